@@ -1,0 +1,21 @@
+# One set of objects serves the shared library and, for unit tests of what is not exported, a static one.
+file(GLOB_RECURSE QV_SOURCES CONFIGURE_DEPENDS
+     ${CMAKE_SOURCE_DIR}/core/*.cpp ${CMAKE_SOURCE_DIR}/builtin/*.cpp)
+
+add_library(qv_objects OBJECT ${QV_SOURCES})
+target_compile_definitions(qv_objects PRIVATE QV_BUILDING_LIBRARY)
+target_include_directories(qv_objects PUBLIC ${CMAKE_SOURCE_DIR})
+target_link_libraries(qv_objects PUBLIC
+  Threads::Threads ZLIB::ZLIB PNG::PNG EXPAT::EXPAT Freetype::Freetype
+  PkgConfig::FONTCONFIG PkgConfig::HARFBUZZ PkgConfig::FRIBIDI PkgConfig::CRYPTOPP PkgConfig::HWY
+  ${CMAKE_DL_LIBS})
+
+add_library(qvplugcore SHARED $<TARGET_OBJECTS:qv_objects>)
+target_link_libraries(qvplugcore PRIVATE qv_objects)
+set_target_properties(qvplugcore PROPERTIES VERSION ${PROJECT_VERSION} SOVERSION ${PROJECT_VERSION_MAJOR})
+target_include_directories(qvplugcore INTERFACE
+  $<BUILD_INTERFACE:${CMAKE_SOURCE_DIR}>
+  $<INSTALL_INTERFACE:include> $<INSTALL_INTERFACE:include/qvplugcore>)
+
+add_library(qv_static STATIC EXCLUDE_FROM_ALL $<TARGET_OBJECTS:qv_objects>)
+target_link_libraries(qv_static PUBLIC qv_objects)

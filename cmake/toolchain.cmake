@@ -1,0 +1,24 @@
+# Compiler cache, linker, warnings and sanitizers: the same for the library, the tool and the tests.
+find_program(QV_CCACHE ccache)
+if(QV_CCACHE)
+  # The base folder makes objects of equal sources shareable between checkouts.
+  set(CMAKE_CXX_COMPILER_LAUNCHER
+      ${CMAKE_COMMAND} -E env CCACHE_BASEDIR=${CMAKE_SOURCE_DIR} CCACHE_NOHASHDIR=1 ${QV_CCACHE})
+endif()
+find_program(QV_MOLD mold)
+if(QV_MOLD)
+  add_link_options(-fuse-ld=mold)
+endif()
+
+add_compile_options(-Wall -Wextra -Wconversion -fno-math-errno -ffp-contract=off
+                    -fmacro-prefix-map=${CMAKE_SOURCE_DIR}/=)
+if(QV_WERROR)
+  add_compile_options(-Werror)
+endif()
+
+# Sanitizers need frames and line numbers, and -O1 to be fast enough for whole transcodes.
+set(CMAKE_CXX_FLAGS_SANITIZE "-O1 -g1 -fno-omit-frame-pointer")
+if(QV_SANITIZE)
+  add_compile_options(-fsanitize=${QV_SANITIZE} -fno-sanitize-recover=all)
+  add_link_options(-fsanitize=${QV_SANITIZE})
+endif()
