@@ -26,9 +26,15 @@
 #include <variant>
 
 #include "core/engine/status.h"
-#include "core/media/qvgeometry.h"
 #include "core/value/any.h"
 #include "core/value/anycontainer.h"
+
+// A unit that makes a table includes "core/media/qvgeometry.h" for these.
+class QvFramerate;
+class QvRect;
+class QvPoint;
+class QvBitrate;
+class MediaTime;
 
 enum QvParamFlag : unsigned {
     qvParamPlain = 0,
