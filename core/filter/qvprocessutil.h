@@ -1,0 +1,81 @@
+// Turns a job description into a ready processing pipe, and describes filter parameters to user interfaces.
+//
+// Order of a video chain: front custom filters; a rate reduction; flipper; cropper; deinterlacer; scaler; any
+// other rate conversion; back custom filters. Order of an audio chain: aquant to 32 bits; front custom
+// filters; rate and channel converter, the rate converter on the side with fewer channels; back custom
+// filters; aquant to the output's width. A chain without any filter is no pipe at all.
+#pragma once
+
+#include "core/arch/api.h"
+#include "core/value/any.h"
+#include "core/value/anycontainer.h"
+
+class MediaTime;
+class QvAProcessPipe;
+class QvDecodePipe;
+class QvEncodePipe;
+class QvFrame;
+class QvFramerate;
+class QvMuxer;
+class QvVProcessPipe;
+struct AudioJobDescription;
+struct VideoJobDescription;
+
+enum QvGuiControl {
+    QV_GUI_EDITBOX = 1,
+    QV_GUI_EDIT = QV_GUI_EDITBOX,
+    QV_GUI_SLIDER = 2,
+    QV_GUI_CHECKBOX = 3,
+    QV_GUI_FILESELECT_LOAD = 4,
+    QV_GUI_FILESELECT_SAVE = 5,
+    QV_GUI_COMBOBOX = 6
+};
+
+class QV_API QvProcessUtil {
+  public:
+    // An open pipe, owned by the caller; null when the job needs no processing.
+    static QvVProcessPipe* createVideoPipe(const VideoJobDescription& job);
+    // The same for pictures of several views; the job must outlive the pipe if there are 2 or more. Null also
+    // when that pipe does not open.
+    static QvVProcessPipe* createVideoPipeMV(const VideoJobDescription& job, int nrViews);
+    // A null module name means "vprocess"; a name without module asserts. A pipe that fails to open asserts.
+    static QvVProcessPipe* createVideoPipeAux(const VideoJobDescription& job, const char* moduleName,
+                                              bool deferOpen);
+    // Tells the encoder what the pipe (null: none) already does and what it is to do itself.
+    static void adjustVideoEncoder(const VideoJobDescription& job, QvVProcessPipe* pipe,
+                                   QvEncodePipe* encoderPipe, int encoderStream);
+
+    // A pipe that is not open yet, owned by the caller; null when the job needs no processing. A delay filter
+    // that asks for no or a negative delay becomes the time at the input's start that is to be skipped.
+    static QvAProcessPipe* createAudioPipe(const AudioJobDescription& job, MediaTime& delayOut);
+    // Gives the peak level of the stream's samples from..to to the filters that need it. Reads the whole
+    // stream if any does.
+    static void applyStreamReport(QvAProcessPipe* pipe, QvDecodePipe* decoder, int decoderStream,
+                                  long long from, long long to);
+
+    // Frame numbers at one rate to another. The first element decides whether they are Int32 or Int64; `out`
+    // stays as it was when `in` is empty.
+    static void rescaleTimePoints(const AnyVector& in, const QvFramerate& fromRate, const QvFramerate& toRate,
+                                  AnyVector* out);
+    // What each stream has to be delayed by in smart rendering, in ticks: "video" and "audio", one Int64 a
+    // stream; empty when no stream has a delay.
+    static void calculateSRAudioDelayCorrections(QvMuxer* muxer, AnyDict& dict);
+
+    // Description of a parameter of type Any::INT32, FLOAT, STRING or WSTRING. Without a `min` of that type
+    // there is no range.
+    static AnyDict createParamDesc(const char* name, int type, int guiControl, const char* description,
+                                   const Any& min = Any(), const Any& max = Any(), const Any& step = Any());
+    static AnyDict createParamDesc(const char* name, int type, int guiControl, const char* description,
+                                   const AnyVector& allowed);
+    // False, with the first fault in `error` if given, for a description that no user interface could show.
+    static bool checkParamDesc(const AnyDict& desc, Any* error = nullptr);
+};
+
+// Full-range luma to studio range.
+class QV_API YSwingCorrect {
+  public:
+    // Changes the luma words of a Y216 frame; other frames are left alone. 0.
+    static int correct(QvFrame& frame);
+    static const unsigned char* table8();    // 256 entries
+    static const unsigned short* table16();  // 65536 entries
+};
