@@ -1,0 +1,42 @@
+// The exceptions that the engine throws.
+#pragma once
+
+#include <memory>
+
+#include "core/arch/api.h"
+
+// Base of the family. Holds a copy of its text, cut to 1,023 characters. If there is no memory for the copy
+// the object stays without a text and what() gives "Tarsel exception".
+class QV_API QvException {
+  public:
+    explicit QvException(const char* text = nullptr);  // null: no text is kept
+    QvException(const QvException& other);
+    QvException& operator=(const QvException& other);
+    virtual ~QvException();
+    virtual const char* what() const;  // never null; lives as long as the exception keeps its text
+    operator const char*() const { return what(); }
+
+  private:
+    std::unique_ptr<char[]> text_;
+};
+
+// A parameter that a codec does not know. Null text: "unknown parameter".
+class QV_API QvParamException : public QvException {
+  public:
+    explicit QvParamException(const char* text = nullptr);
+    ~QvParamException() override;
+};
+
+// A broken contract, thrown by qvAssertFail. Null text: "assertion failure".
+class QV_API QvAssertFailure : public QvException {
+  public:
+    explicit QvAssertFailure(const char* text = nullptr);
+    ~QvAssertFailure() override;
+};
+
+// Null text: "file access error".
+class QV_API QvFileException : public QvException {
+  public:
+    explicit QvFileException(const char* text = nullptr);
+    ~QvFileException() override;
+};
