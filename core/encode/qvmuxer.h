@@ -3,14 +3,11 @@
 #pragma once
 
 #include "core/encode/qvencoder.h"
+#include "core/media/streamtype.h"
 #include "core/value/anycontainer.h"
 
 class QvFileMuxConfig;
 
-// Stream types are bits: 1 video, 2 audio, 4 subpicture. Where a mask is taken, 0 and 255 mean all.
-enum QvStreamType : int { qvVideoStream = 1, qvAudioStream = 2, qvSubpicStream = 4, qvAllStreams = 255 };
-
-constexpr bool qvStreamTypeMatches(int type, int mask) { return mask == 0 || (type & mask) != 0; }
 // "video", "audio" or "subpic"; the last for any other value too.
 QV_API const char* qvStreamTypeName(int type);
 

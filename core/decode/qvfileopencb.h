@@ -1,0 +1,26 @@
+// How an application follows the opening of files.
+#pragma once
+
+#include "core/arch/api.h"
+#include "core/value/any.h"
+
+// What is being opened; one object serves all calls for a file.
+struct QV_API QvFileOpenCbData {
+    Any filename;     // the name, or the Vector of names, as the application gave it
+    Any moduleName;   // the decoder being tried; invalid until the first one
+    Any text;         // message of the last failure, or of the success; invalid before
+    int percent = 0;  // 100 at the success of decodePipe and decodePipeUsing
+};
+
+// An application derives from it what it wants to know. Results are ignored. The calls come on the thread
+// that opens the file.
+struct QV_API QvFileOpenCb {
+    virtual ~QvFileOpenCb();
+    // Before a decoder is tried; also, once, for a file that no decoder takes.
+    virtual int fileOpenStarted(QvFileOpenCbData& data);
+    // After each failed try with -1, and with 0 after the success: one file can fail several times and then
+    // succeed.
+    virtual int fileOpenFinished(int result, QvFileOpenCbData& data);
+    // By a decoder during a long open.
+    virtual int fileOpenProgress(QvFileOpenCbData& data);
+};
