@@ -1,0 +1,145 @@
+// The platform contract: all that the engine asks of the operating system, in one substitutable class.
+//
+// QvPlatform's own bodies are the real system's (core/arch/posix). A test derives from it, overrides the
+// operation that shall fail (a disk that fills up, a thread that does not start) and installs the object
+// with qv_set_platform; see tests/support/platform_scope.h.
+//
+// Names are byte strings: what the file system holds, UTF-8 by custom but not by force. Wide names become
+// bytes before they come here, see core/arch/widename.h. A name that is empty is never found.
+//
+// Unless said otherwise `int` results are 0 for success and -1 for failure, nothing throws but bad_alloc,
+// and every operation may be called from any thread.
+#pragma once
+
+#include <cstddef>
+#include <cstdio>
+#include <ctime>
+#include <functional>
+#include <string>
+#include <string_view>
+#include <thread>
+#include <vector>
+
+#include "core/arch/api.h"
+
+struct QvFileStatus {
+    bool isFolder = false;
+    bool isRegular = false;    // neither folder nor device, pipe or socket
+    long long size = 0;        // bytes; of a regular file
+    long long modifiedNs = 0;  // nanoseconds since 1970-01-01 00:00 UTC
+};
+
+struct QvFolderEntry {
+    std::string name;       // without the folder
+    bool isFolder = false;  // also true of a symbolic link to a folder
+};
+
+enum class QvFontFace { sans, sansItalic, sansBold, monospaceBold };
+
+class QV_API QvPlatform {
+  public:
+    virtual ~QvPlatform();
+
+    // --- Files -----------------------------------------------------------------------------------------
+
+    // A stream of the C library, or null. Modes are fopen's: "r", "w", "a", each with "+" and "b". Folders
+    // are refused, and child processes do not inherit the file. The caller reads, writes and closes it with
+    // the C library; a substitute that wants these to fail returns a stream of its own making.
+    virtual std::FILE* openFile(const char* name, const char* mode);
+    // A file descriptor of the C runtime for libraries that take nothing else, or -1. Writing creates or
+    // truncates. The caller closes it through the library.
+    virtual int openDescriptor(const char* name, bool writing);
+    // Positions of 64 bits; `origin` is SEEK_SET, SEEK_CUR or SEEK_END. tell gives -1 on failure.
+    virtual int seek(std::FILE* file, long long offset, int origin);
+    virtual long long tell(std::FILE* file);
+    // Brings what was written to the disc.
+    virtual int sync(std::FILE* file);
+
+    // Follows symbolic links. False, with `status` untouched, if there is nothing of this name.
+    virtual bool status(const char* name, QvFileStatus& status);
+    // True if both names lead to one existing file, whatever links lie between.
+    virtual bool sameFile(const char* first, const char* second);
+    virtual int removeFile(const char* name);
+    virtual int removeFolder(const char* name);  // an empty one
+    // Success too if the folder is there already, made by another process in between.
+    virtual int makeFolder(const char* name);
+    // Renames, or copies and removes where the two lie on different discs; the target never shows half a
+    // file. An existing target is replaced in one step with `replace`, and is a failure without.
+    virtual int moveFile(const char* from, const char* to, bool replace);
+    // Appends all entries, "." and ".." included, in byte order of their names. Does not touch the
+    // process's current folder.
+    virtual int listFolder(const char* folder, std::vector<QvFolderEntry>& entries);
+    // Removes a folder with all it holds. A symbolic link in it is removed and never followed, and a `folder`
+    // that is itself a link is refused. Entries for which `keep` is true stay, which makes the result -1.
+    virtual int removeTree(const char* folder, bool (*keep)(std::string_view entry));
+    // Bytes that this user may still write to the disc of `name`; if `name` does not exist, of the nearest
+    // folder above it that does. -1 if that can't be found out.
+    virtual long long freeSpace(const char* name);
+    virtual std::string currentFolder();  // empty on failure
+
+    // --- Environment -----------------------------------------------------------------------------------
+
+    // False if the variable is not set.
+    virtual bool environment(const char* name, std::string& value);
+    virtual std::string homeFolder();  // of the user; without a separator at the end
+    virtual std::string tempFolder();  // likewise
+    virtual bool isTerminal(std::FILE* stream);
+    virtual void debugOutput(const char* text);  // as it stands, no newline is added
+
+    // --- Libraries and processes -----------------------------------------------------------------------
+
+    // A library with its dependencies, which are also looked for in its own folder. Null on failure, with the
+    // system's reason in `error`. Symbols stay local to the library.
+    virtual void* loadLibrary(const char* name, std::string& error);
+    virtual void* findSymbol(void* library, const char* symbol);  // null if absent
+    virtual void unloadLibrary(void* library);
+    virtual std::string coreLibraryPath();  // full name of the file that holds the engine
+    // Gives `command` to the shell and waits for its end without limit. The result is the exit code, 128 plus
+    // the signal's number if a signal ended it, or -1 if it can't be started. The command reads nothing from
+    // this process's standard input.
+    virtual int runCommand(const char* command);
+
+    // --- Threads and time ------------------------------------------------------------------------------
+
+    // A running thread, or one that is not joinable() if the system has no more. `body` must not throw.
+    virtual std::thread startThread(std::function<void()> body);
+    // Makes the calling thread yield to interactive work. The result goes to restoreThreadPriority on the
+    // same thread.
+    virtual int lowerThreadPriority();
+    virtual void restoreThreadPriority(int former);
+    virtual void sleep(int milliseconds);
+    virtual int processors();  // that this process may use, at least 1
+
+    virtual long long steadyNs();  // never goes back; the origin is arbitrary
+    virtual long long systemNs();  // since 1970-01-01 00:00 UTC
+    // The calendar form of seconds since 1970 in the user's time zone. False if it has none.
+    virtual bool localTime(long long seconds, std::tm& calendar);
+
+    // --- Memory ----------------------------------------------------------------------------------------
+
+    // For blocks of the size of a picture or a stream buffer, whose absence is an expected failure: null if
+    // there is not enough. `alignment` is a power of two. release takes null.
+    virtual void* allocate(std::size_t bytes, std::size_t alignment);
+    virtual void release(void* block);
+
+    // --- Text, fonts and facts -------------------------------------------------------------------------
+
+    virtual bool hasCodepage(int number);
+    // Appends the code points of `bytes`, read in a code page, to `text`. What is not valid in it becomes
+    // U+FFFD, a byte each. False if the system does not know the code page.
+    virtual bool decodeCodepage(int number, std::string_view bytes, std::u32string& text);
+    virtual std::string fontFile(QvFontFace face);  // full name, empty if the system has no font at all
+    virtual std::string cpuFeatures();              // "MMX SSE2 ...", in a fixed order
+    virtual std::string platformName();             // "Linux x64"
+
+    // `name` as one word of a shell command: no character in it can act, and no leading "-" makes an option
+    // of it.
+    virtual std::string quoteForShell(std::string_view name);
+};
+
+// The platform in force: the system's own unless a test has put another in its place.
+QV_API QvPlatform& qv_platform();
+
+// Puts `substitute` in force, null the system's own, and returns what was in force before (null for the
+// system's own). The caller keeps it alive while it is in force and any stream or thread of it is in use.
+QV_API QvPlatform* qv_set_platform(QvPlatform* substitute);

@@ -1,0 +1,47 @@
+// A fixed set of worker threads that share out the parts of one piece of work, such as bands of a picture.
+//
+//     qvThreadPool().parallelFor(bands, [&](int band) { convertRows(band * rows, ...); });
+#pragma once
+
+#include <memory>
+#include <type_traits>
+
+#include "core/arch/api.h"
+
+class QV_API QvThreadPool {
+  public:
+    // `workers` threads beside the callers, at least 0. Fewer if the system has no more: the work is then
+    // done by those there are, if need be by the caller alone.
+    explicit QvThreadPool(int workers);
+    ~QvThreadPool();  // no parallelFor may be running
+    QvThreadPool(const QvThreadPool&) = delete;
+    QvThreadPool& operator=(const QvThreadPool&) = delete;
+
+    // Calls `task(i)` once for each i from 0 up to but not including `count`, in any order, on the workers
+    // and on the caller, and returns when all calls have returned; what they wrote is then visible to the
+    // caller. Allocates nothing. A task may itself call parallelFor, on this pool or another. Several threads
+    // may call at once. If tasks throw, indices not begun yet are left out and the first exception goes on to
+    // the caller.
+    template <class Task>
+    void parallelFor(int count, Task&& task) {
+        using Plain = std::remove_reference_t<Task>;
+        run(
+            count, [](void* context, int index) { (*static_cast<Plain*>(context))(index); },
+            const_cast<void*>(static_cast<const void*>(std::addressof(task))));
+    }
+
+    // How many threads can work at once, the caller counted: the number of bands worth cutting.
+    int width() const;
+
+  private:
+    using Call = void (*)(void* context, int index);
+    struct Job;
+    struct State;
+
+    void run(int count, Call call, void* context);
+
+    std::unique_ptr<State> state_;
+};
+
+// The engine's one pool, made on first use with one worker less than there are processors.
+QV_API QvThreadPool& qvThreadPool();
