@@ -34,9 +34,6 @@ QV_API void get_folder_files_by_ext(const Any& folder, const char* ext, AnyVecto
 // signal's number if a signal ended it; -1 if it can't be started. The command finds nothing to read on its
 // standard input.
 QV_API int execute_process(const Any& commandLine);
-// A name as one word of such a command line, whatever characters it holds. Invalid if it is no text.
-QV_API Any quote_for_process(const Any& name);
-
 QV_API void debug_trace(const char* text);                      // to the debugger output
 QV_API void debug_trace1(const char* first, const char* text);  // "first text\n"
 
@@ -64,8 +61,11 @@ class QV_API QvFile {
     // Turns the other kind of separator into `separator`, in place. True if anything changed.
     static bool setSeparator(Any& name, char separator);
     // A backslash before each of |&;<>()$`\"' blank tab. For text that a user reads or pastes; a command line
-    // of the engine's own takes quote_for_process.
+    // of the engine's own takes shellQuote.
     static Any shellEscape(const Any& text);
+    // A name as one word of a command line for execute_process, whatever characters it holds: none of them
+    // can act there, and a leading "-" makes no option. Invalid if it is no text.
+    static Any shellQuote(const Any& name);
 
     // --- Places --------------------------------------------------------------------------------------------
     static Any homeDir();  // no separator at the end
