@@ -1,0 +1,28 @@
+// The first failure of a stream's input or output, kept for whoever asks after the work.
+#pragma once
+
+#include <string>
+
+#include "core/arch/api.h"
+#include "core/arch/widename.h"
+
+// Records of the C interface answer with a null block or a short count and can't say why; and what fails
+// while a file is closed has no caller to answer to. Both leave their reason here. Belongs to the thread that
+// drives the stream.
+class QV_API QvIoFailure {
+  public:
+    // Keeps the first one: "what 'name': reason" with the system's text of `code`, an errno value (0 counts
+    // as EIO). report() also tells the user, through qv_log() as an error; note() does not.
+    void report(int code, const char* what, const QvWideString& name);
+    void note(int code, const char* what, const QvWideString& name);
+    void clear();
+
+    int code() const { return code_; }
+    const std::string& text() const { return text_; }
+
+  private:
+    bool keep(int code, const char* what, const QvWideString& name);
+
+    int code_ = 0;
+    std::string text_;
+};

@@ -1,0 +1,113 @@
+// Streams of the elementary stream export. Each is either a plain file, or takes the encoder's output apart:
+// one file for each picture, or WAV files. They write in the encoder's thread, when it reports an access
+// unit.
+//
+// Failures to open or write are logged, stop the ring, so that the encoder gets no more room, and stay in
+// ioError().
+#pragma once
+
+#include <array>
+#include <cstdio>
+#include <memory>
+
+#include "core/media/qvbuffer.h"
+#include "core/stream/qvbuffifo.h"
+#include "core/stream/qvfilebufstream.h"
+
+class QvColorConverter;
+
+// Parameters: "outfilename"; "split" Int32 0 for a plain file, anything else for files NAME#0.EXT, NAME#1.EXT
+// and so on; "nrDigits" (Int32), width of the number, with zeros in front; "png" true to write each access
+// unit as a PNG picture, which "width", "height" and "FOURCC" describe. "chunk" must hold a whole picture
+// then.
+class QV_API QvBsSplitVideo : public QvBufStreamFifoCb {
+  public:
+    explicit QvBsSplitVideo(QvCodec* owner = nullptr);
+    ~QvBsSplitVideo() override;
+
+    using QvBufStream::init;
+    int init(const AnyDict& params) override;  // asserts that "outfilename" is text
+    void destroy(int abort) override;
+    void flush() override;
+    bufstream* input() override;
+    bufstream* output() override;
+    int registerObserver(QvAuxInfoObserver* observer) override;
+    int unregisterObserver(QvAuxInfoObserver* observer) override;  // a plain file still tells a listed one
+    int unregisterAllObservers() override;
+    TPtrList<QvAuxInfoObserver>* observers() override;
+
+    void cbProgress(int bytes) override;
+    void cbAuxinfo(unsigned offset, unsigned id, void* info, unsigned size) override;
+
+  private:
+    int initPlain(const AnyDict& params);
+    void initPicture();
+    Any _currentFilename() const;
+    void writeAccessUnit(unsigned bytes);
+    void writePicture(bufstream* ring, unsigned bytes, const Any& name);
+    void writeFile(bufstream* ring, unsigned bytes, const Any& name);
+
+    TPtrList<QvAuxInfoObserver> observers_;
+    int fileCounter_ = 0;
+    int nrDigits_ = 0;
+    Any baseName_, extension_, path_;
+    bool split_ = false;
+    bool png_ = false;
+    int width_ = 0, height_ = 0;
+    unsigned fourcc_ = 0;
+    std::unique_ptr<QvFileBufStream> inner_;  // null in split mode
+    std::unique_ptr<QvColorConverter> converter_;
+    std::unique_ptr<QvFrame> converted_;
+};
+
+// Parameters: "outfilename"; "isPcm" Int32 0 for a plain file, anything else for WAV; "split" true for one
+// mono file for each channel, NAME#00.EXT, NAME#01.EXT and so on, at most 32; "samplerate", "channels",
+// "bitsPerSample" (20 bits stand in 3 bytes).
+//
+// The header is written when STREAM_END_CODE comes; before that the file has 80 zero bytes in its place. Size
+// fields that a file beyond 4 GiB can't state are 0xFFFFFFFF, with a warning; the samples are all there.
+class QV_API QvBsSplitAudio : public QvBufStreamFifoCb {
+  public:
+    static constexpr int maxFiles = 32;
+
+    explicit QvBsSplitAudio(QvCodec* owner = nullptr);
+    ~QvBsSplitAudio() override;
+
+    using QvBufStream::init;
+    int init(const AnyDict& params) override;
+    void destroy(int abort) override;
+    void flush() override;
+    bufstream* input() override;
+    bufstream* output() override;
+
+    void cbProgress(int bytes) override;
+    void cbAuxinfo(unsigned offset, unsigned id, void* info, unsigned size) override;
+
+  private:
+    int initPlain(const AnyDict& params);
+    int initPcm(const AnyDict& params);
+    bool readFormat();
+    int openFile(int index, const Any& name);
+    int fileCount() const { return split_ ? channels_ : 1; }
+    Any _fileName(int index) const;
+    Any _channelFileName(int channel) const;
+    void _onAudioBytes(const void* info, unsigned size);
+    bool writeInterleaved(bufstream* ring, unsigned bytes);
+    bool writeChannels(bufstream* ring, unsigned bytes);
+    bool writeItem(int index, const void* data, size_t bytes);
+    void onStreamEnd();
+    void closeFile(int index);
+    void _writeWavHeaders();
+
+    Any baseName_, extension_, path_;  // without "split" baseName_ is the whole name
+    std::array<std::FILE*, maxFiles> files_{};
+    std::array<QvPcm, maxFiles> channelBuffers_;
+    bool split_ = false;
+    bool ring_ = false;
+    QvPcm work_;
+    std::unique_ptr<QvFileBufStream> inner_;  // null when the ring is used
+    int bitsPerSample_ = 0;
+    int channels_ = 0;
+    int samplerate_ = 0;
+    unsigned carried_ = 0;  // bytes of an incomplete sample at the head of the ring
+};
