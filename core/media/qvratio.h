@@ -2,10 +2,14 @@
 #pragma once
 
 #include "core/arch/api.h"
+#include "core/engine/qvnum.h"
 
 // num / den. Any signs are allowed; a zero denominator reads as the double 0.0.
 class QV_API QvRatio {
   public:
+    // Rates agree when they are closer than this: 1e-4 in single precision.
+    static constexpr double tolerance = 9.999999747378752e-5;
+
     int num = 24;
     int den = 1;
 
@@ -37,18 +41,4 @@ class QV_API QvRatio {
     // Rescales a count from one rate to another: value * from.num * to.den / (from.den * to.num), truncated.
     // The divisor is a 32-bit product, and wraps as one. A divisor of zero is an assertion.
     static long long multyplyByRatio(long long value, const QvRatio& from, const QvRatio& to);
-};
-
-// Numbers compared by tolerance, and rational approximation.
-class QV_API QvNum {
-  public:
-    // Rates agree when they are closer than this: 1e-4 in single precision.
-    static constexpr double rateTolerance = 9.999999747378752e-5;
-
-    // True if |a - b| is strictly below the tolerance; false if a number is NaN.
-    static bool equ(double a, double b, double tolerance);
-
-    // The smallest denominator from 1 to maxDen - 1 whose multiple of `value` is closer than `tolerance` to
-    // an integer. 0, or -1 with num and den -1 if there is none or maxDen is below 2.
-    static int ratio(double value, int& num, int& den, int maxDen, double tolerance);
 };
