@@ -1,0 +1,93 @@
+// One run of a transcoder: opening, the main loop, and closing.
+#pragma once
+
+#include <vector>
+
+#include "core/media/qvgeometry.h"
+#include "core/transcode/qvtranscoder_p.h"
+
+class TransLink;
+
+// How often cbProgress comes and what it tells.
+class QvProgressReport {
+  public:
+    // `settings`: the transcoder's "progress" dictionary. `total`: frames of the run, 0 when unknown.
+    // `rate`: frames a second, for settings in seconds.
+    QvProgressReport(const AnyDict& settings, int total, double rate);
+
+    // Called once a round. True when a report is due; `part` (0 to 1) is then what to report.
+    bool due(double now, double& part);
+    // The share of this pass in the whole: part * scale + offset.
+    void setPass(double offset, double scale) { offset_ = offset, scale_ = scale; }
+    int round() const { return counter_; }
+
+    static constexpr int byTime = -1;
+
+  private:
+    double partDone() const;
+
+    int step_ = 0;           // rounds between reports, or byTime
+    int total_ = 0;
+    int counter_ = 0;        // rounds so far
+    int lastReported_ = -1;
+    double interval_ = 0;    // seconds, when by time
+    double lastTime_ = 0;
+    double offset_ = 0, scale_ = 1;
+};
+
+class QvTranscodeRun {
+  public:
+    QvTranscodeRun(QvTranscoder& transcoder, QvTranscoder::Private& state) : t_(transcoder), p_(state) {}
+
+    // Checks the task, opens the links, seeks the inputs and opens the output. 0, -16, or a failure after
+    // which nothing is left open.
+    int open();
+    // The run itself, from the first step to cbDone. The error, or 0.
+    int start();
+    // The first pass of a two-pass run: fills the statistics of each encoder that wants them.
+    int analyze();
+
+    static int totalFrames(const QvTask& task, double& rate);
+    static void closeLinks(const QvTask& task);
+
+  private:
+    // open
+    void collectParams();
+    int checkTask(int& warning);
+    int openLinks();
+    int seekInputs();
+    void setMuxerLength();
+    void copyMeta();
+    int openEncoder();
+    void logSettings() const;
+    void beginLogFile();
+    // start
+    int runPasses();
+    int mainLoop();
+    int closeOutput(int result);
+    int finish(int result);
+    // main loop
+    void videoTurn();
+    void audioTurn();
+    int audioDue(TransLink& link) const;
+    void link(TransLink& link, int n);
+    void waitWhilePaused();
+    void report(QvProgressReport& progress);
+    void callProcess();
+    int checkDisc();
+    void logTurn();
+    void stopLoop() { p_.stopRequested = true; }
+    bool stopping() const { return p_.stopRequested.load(std::memory_order_relaxed); }
+
+    QvTranscoder& t_;
+    QvTranscoder::Private& p_;
+
+    std::vector<TransLink*> video_, audio_;
+    QvFramerate rate_;           // at which audio is measured against the frames written
+    long long framesDone_ = 0;   // by the video link that was worked on last
+    int rounds_ = 0;
+    int result_ = 0;             // of the last step
+    bool endOfVideo_ = false;
+    bool allDone_ = false;
+    double lastTurn_ = 0;
+};
