@@ -3,6 +3,7 @@
 #include <string>
 #include <vector>
 
+#include "core/arch/platform.h"
 #include "core/decode/qvdecoder.h"
 #include "core/encode/qvencodepipe.h"
 #include "core/encode/qvmuxer.h"
@@ -21,7 +22,7 @@ std::string narrow(const Any& text) {
     return converted.isString() ? std::string(converted.asString()) : std::string();
 }
 
-std::string quoted(const Any& name) { return narrow(QvFile::shellQuote(QvFile::osFname(name))); }
+std::string quoted(const Any& name) { return qv_platform().quoteForShell(narrow(QvFile::osFname(name))); }
 
 std::string joined(const std::vector<std::string>& names) {
     std::string all;
@@ -49,7 +50,7 @@ void collectOutputs(QvEncodePipe& pipe, Names& names) {
     // Several streams of a type are numbered behind a "#"; the base name is what they share.
     const bool numbered = pipe.nrStreams(1) > 1 || pipe.nrStreams(2) > 1;
     if (files.size() > 1 && numbered) base = base.substr(0, base.find('#'));
-    names.outBase = narrow(QvFile::shellQuote(Any(base.c_str())));
+    names.outBase = qv_platform().quoteForShell(base);
 }
 
 // The name that a number behind a placeholder means. Of "12" with three names only the "1" is the number;

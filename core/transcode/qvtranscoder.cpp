@@ -2,7 +2,7 @@
 
 #include <cstdarg>
 #include <cstdio>
-#include <system_error>
+#include <string_view>
 
 #include "core/encode/qvencodepipe.h"
 #include "core/encode/qvencoder.h"
@@ -73,7 +73,7 @@ void QvTranscoder::Private::waitForEnd() {
                    runThread.load() == std::thread::id();
         });
     }
-    if (worker.joinable()) worker.join();
+    worker.wait();
 }
 
 void QvTranscoder::Private::returnTask() {
@@ -338,7 +338,7 @@ int QvTranscoder::transcode(bool synchronous) {
         p_->setState(connected);
         return opened;
     }
-    if (p_->worker.joinable()) p_->worker.join();
+    p_->worker.wait();
     p_->synchronous = synchronous;
     if (synchronous) {
         p_->runThread = std::this_thread::get_id();
@@ -347,17 +347,16 @@ int QvTranscoder::transcode(bool synchronous) {
         p_->setState(connected);
         return result;
     }
-    try {
-        // The worker takes the run with it: it outlives this call.
-        p_->worker = std::thread([this, run]() mutable {
+    // The worker takes the run with it: it outlives this call.
+    const int started = p_->worker.start([this, run]() mutable {
             p_->runThread = std::this_thread::get_id();
             qv_dbg()->debug("Transcoder thread started");
             run.start();
             qv_dbg()->debug("Transcoder thread exiting");
             p_->runThread = std::thread::id();
             p_->changed.notify_all();
-        });
-    } catch (const std::system_error&) {
+    });
+    if (started != QvStatus::ok) {
         QvTranscodeRun::closeLinks(*p_->task);
         return setError(QvStatus::failed, "Failed to spawn processing thread");
     }
@@ -366,7 +365,7 @@ int QvTranscoder::transcode(bool synchronous) {
 
 int QvTranscoder::stop() {
     if (getState() == notConnected) {
-        if (p_->worker.joinable()) p_->worker.join();
+        p_->worker.wait();
         return QvStatus::ok;
     }
     if (!p_->synchronous) p_->resume();

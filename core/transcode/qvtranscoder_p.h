@@ -9,6 +9,7 @@
 #include <thread>
 #include <vector>
 
+#include "core/engine/qvthreads.h"
 #include "core/transcode/qvtranscodetask.h"
 #include "core/transcode/qvtranscoder.h"
 
@@ -44,7 +45,7 @@ struct QvTranscoder::Private {
     std::atomic<int> state{QvTranscoder::notConnected};
     std::atomic<bool> stopRequested{false}, firstPassRunning{false};
     std::atomic<bool> synchronous{true};
-    std::thread worker;
+    QVThreads::QvThread worker;
     std::atomic<std::thread::id> runThread{};  // who runs the job now; none: nobody
     bool inCallback = false;
     bool checkDiscSpace = false, logProgress = false;

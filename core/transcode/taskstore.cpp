@@ -2,7 +2,7 @@
 #include <algorithm>
 #include <memory>
 
-#include "core/decode/qvdecfactory.h"
+#include "core/decode/decodefactory.h"
 #include "core/decode/qvdecoder.h"
 #include "core/encode/qvencodepipe.h"
 #include "core/engine/paramtrace.h"

@@ -1,0 +1,234 @@
+// The main loop of a run: one frame of every video link a turn, then exactly the samples that belong to the
+// frames written so far.
+#include <algorithm>
+#include <chrono>
+#include <string_view>
+
+#include "core/encode/qvencodepipe.h"
+#include "core/encode/qvmuxer.h"
+#include "core/engine/qvexception.h"
+#include "core/engine/qvfileutil.h"
+#include "core/engine/qvlog.h"
+#include "core/engine/qvregistry.h"
+#include "core/engine/qvthreads.h"
+#include "core/engine/qvtimer.h"
+#include "core/engine/status.h"
+#include "core/stream/metadatafile.h"
+#include "core/transcode/qvtranscoderun.h"
+#include "core/transcode/translink.h"
+
+namespace {
+
+constexpr int kStopped = 1;  // what cbDone gets for a run that was stopped
+
+// Set while a callback runs, also when it throws.
+struct CallbackScope {
+    explicit CallbackScope(bool& flag) : flag_(flag) { flag_ = true; }
+    ~CallbackScope() { flag_ = false; }
+    bool& flag_;
+};
+
+}  // namespace
+
+int QvTranscodeRun::start() {
+    p_.logProgress = qv_registry()->getDbgOption("log_progress").isTrue();
+    // Lets the caller finish what it does after transcode() returns; a stop ends the wait.
+    if (p_.startDelay > 0) {
+        std::unique_lock guard(p_.lock);
+        p_.changed.wait_for(guard, std::chrono::milliseconds(p_.startDelay), [this] { return stopping(); });
+    }
+    const QvMuxer* muxer = p_.task->encoder()->getMuxer();
+    p_.checkDiscSpace = muxer && std::string_view(muxer->name()) == "asfmux";
+    int result = QvStatus::failed;
+    try {
+        QVThreads::QvLowPriority lowered;
+        result = runPasses();
+    } catch (const QvException& failure) {
+        qv_dbg()->error("Transcoder: %s", failure.what());
+    } catch (const std::exception& failure) {
+        qv_dbg()->error("Transcoder: %s", failure.what());
+    }
+    return finish(result);
+}
+
+int QvTranscodeRun::runPasses() {
+    int result = QvStatus::ok;
+    if (p_.twoPass) result = analyze();
+    if (result != QvStatus::ok) return result;
+    if (p_.twoPass && !stopping()) result = openEncoder();
+    if (result == QvStatus::ok && !(p_.twoPass && stopping())) result = mainLoop();
+    return result;
+}
+
+// Closes the output: finished after a good or stopped run, aborted after an error.
+int QvTranscodeRun::closeOutput(int result) {
+    QvEncodePipe& pipe = *p_.task->encoder();
+    QvDbgLog& log = *qv_dbg();
+    if (QvMuxer* muxer = pipe.getMuxer()) {
+        log.info("[transcoder] Calling cbMuxClose()");
+        t_.cbMuxClose(muxer);
+        log.info("[transcoder] cbMuxClose() returned");
+    }
+    log.info("[transcoder] closing encoding pipe");
+    if (result != QvStatus::ok)
+        pipe.abort();
+    else
+        result = pipe.close();
+    log.info("[transcoder] encoding pipe closed");
+    return result;
+}
+
+int QvTranscodeRun::finish(int result) {
+    try {
+        if (p_.closeEncoder) result = closeOutput(result);
+    } catch (const QvException& failure) {
+        qv_dbg()->error("Transcoder: %s", failure.what());
+        result = QvStatus::failed;
+    }
+    closeLinks(*p_.task);
+    p_.metadataFiles.clear();
+    if (result != QvStatus::ok) t_.setError(QvStatus::failed, "Error in processing");
+    Any command;
+    if (result == QvStatus::ok && !stopping()) command = p_.task->currentPostprocessCommand();
+    const bool stopped = stopping();
+    qv_log()->setLogFile(Any());
+    p_.setState(QvTranscoder::connected);
+    int told = kStopped;
+    if (result != QvStatus::ok) {
+        told = result;
+    } else if (!stopped) {
+        told = QvStatus::ok;
+        if (command.isString()) {
+            t_.cbPostprocess(command);
+            told = execute_process(command);
+        }
+    }
+    t_.cbDone(told);
+    p_.returnTask();
+    return result;
+}
+
+// --- Main loop -------------------------------------------------------------------------------------
+
+int QvTranscodeRun::mainLoop() {
+    const auto links = p_.task->links();
+    for (int i = 0; i < links.size(); ++i)
+        (links.at(i)->type() == 1 ? video_ : audio_).push_back(links.at(i));
+    rate_ = video_.empty() ? QvFramerate::f24p() : static_cast<TransVLink*>(video_.front())->outFramerate();
+    double reportRate = 0;
+    const int total = totalFrames(*p_.task, reportRate);
+    QvProgressReport progress(p_.progress, total, reportRate);
+    if (p_.twoPass && !p_.firstPassRunning) progress.setPass(0.5, 0.5);
+    p_.times.begin(QvTimer::time());
+    lastTurn_ = QvTimer::time();
+    do {
+        if (stopping()) break;
+        allDone_ = true;
+        if (p_.logProgress) logTurn();
+        videoTurn();
+        if (p_.logProgress) logTurn();
+        audioTurn();
+        if (!stopping() && !allDone_) waitWhilePaused();
+        report(progress);
+        callProcess();
+        ++rounds_;
+    } while (!allDone_);
+    if (result_ == QvStatus::ok) checkDisc();
+    if (!endOfVideo_ || result_ != QvStatus::endOfStream) return result_;
+    p_.stopRequested = false;  // the loop asked for it, nobody else
+    return QvStatus::ok;
+}
+
+void QvTranscodeRun::link(TransLink& link, int n) {
+    result_ = link.processFrame(n);
+    p_.times.step(QvTimer::time());
+    if (result_ != QvStatus::ok) stopLoop();
+}
+
+void QvTranscodeRun::videoTurn() {
+    for (TransLink* video : video_) {
+        if (stopping()) return;
+        if (!video->finished()) {
+            link(*video, 0);
+            if (result_ != QvStatus::ok) endOfVideo_ = result_ == QvStatus::endOfStream;
+            framesDone_ = video->outProcessed();
+        }
+        allDone_ = allDone_ && video->finished();
+    }
+}
+
+void QvTranscodeRun::audioTurn() {
+    for (TransLink* audio : audio_) {
+        // The end of the video does not keep the last frames from getting their sound.
+        if (stopping() && !endOfVideo_) return;
+        const int before = result_;
+        link(*audio, audioDue(*audio));
+        if (result_ == QvStatus::ok && before != QvStatus::ok) result_ = before;
+        if (video_.empty()) allDone_ = allDone_ && audio->finished();
+    }
+}
+
+// The synchronisation rule: the samples of all frames written so far, less those that are written.
+int QvTranscodeRun::audioDue(TransLink& link) const {
+    auto& audio = static_cast<TransALink&>(link);
+    const long long frames = video_.empty() ? rounds_ + 1 : framesDone_;
+    long long due = 0;
+    if (frames != 0) due = audio.outSamplesPerFrames(static_cast<int>(frames), rate_) - audio.outProcessed();
+    if (video_.empty()) due = std::min(due, audio.totalOutSamples() - audio.outProcessed());
+    if (due < 0) {
+        qv_dbg()->debug("Transcoder._transcode, audio ahead of video %d samples", static_cast<int>(-due));
+        due = 0;
+    }
+    return static_cast<int>(due);
+}
+
+void QvTranscodeRun::waitWhilePaused() {
+    if (p_.synchronous) return;
+    std::unique_lock guard(p_.lock);
+    if (!p_.paused) return;
+    // The callback may ask for the state of the pause, so it runs outside the lock.
+    guard.unlock();
+    t_.cbPaused(true);
+    guard.lock();
+    p_.changed.wait(guard, [this] { return !p_.paused; });
+    guard.unlock();
+    t_.cbPaused(false);
+}
+
+void QvTranscodeRun::report(QvProgressReport& progress) {
+    double part = 0;
+    if (!progress.due(QvTimer::time(), part) || stopping()) return;
+    if (p_.checkDiscSpace && checkDisc() != QvStatus::ok) {
+        result_ = QvStatus::failed;
+        stopLoop();
+        return;
+    }
+    CallbackScope inside(p_.inCallback);
+    t_.cbProgress(part);
+}
+
+void QvTranscodeRun::callProcess() {
+    CallbackScope inside(p_.inCallback);
+    if (t_.cbProcess() != 0) stopLoop();
+}
+
+// -1 when the disc of the output is full. A disc that does not tell counts as having space.
+int QvTranscodeRun::checkDisc() {
+    const Any name = p_.task->encoder()->getFilename();
+    if (!name.isText()) return QvStatus::ok;
+    const long long space = QvFile::freeSpace(name);
+    if (space == 0) {
+        qv_log()->error("Encode Error. Target disk full.");
+        return QvStatus::failed;
+    }
+    if (space < 0) qv_dbg()->info("Encode Error. Target disk inaccessible.");
+    return QvStatus::ok;
+}
+
+void QvTranscodeRun::logTurn() {
+    const double now = QvTimer::time();
+    char clock[QvTimer::strtimeSize];
+    QvTimer::strtime(clock, now - p_.times.start, QvTimer::hmsm);
+    qv_dbg()->progress("-- %s (tp + %.3f) --", clock, now - lastTurn_);
+    lastTurn_ = now;
+}
