@@ -12,9 +12,7 @@ int rounds(double value) {
     return value < INT_MAX ? static_cast<int>(value) : INT_MAX;
 }
 
-double number(const Any& value) {
-    return value.isInt() || value.isFloat() ? value.toDouble() : 0.0;
-}
+double number(const Any& value) { return value.isInt() || value.isFloat() ? value.toDouble() : 0.0; }
 
 }  // namespace
 

@@ -349,12 +349,12 @@ int QvTranscoder::transcode(bool synchronous) {
     }
     // The worker takes the run with it: it outlives this call.
     const int started = p_->worker.start([this, run]() mutable {
-            p_->runThread = std::this_thread::get_id();
-            qv_dbg()->debug("Transcoder thread started");
-            run.start();
-            qv_dbg()->debug("Transcoder thread exiting");
-            p_->runThread = std::thread::id();
-            p_->changed.notify_all();
+        p_->runThread = std::this_thread::get_id();
+        qv_dbg()->debug("Transcoder thread started");
+        run.start();
+        qv_dbg()->debug("Transcoder thread exiting");
+        p_->runThread = std::thread::id();
+        p_->changed.notify_all();
     });
     if (started != QvStatus::ok) {
         QvTranscodeRun::closeLinks(*p_->task);

@@ -73,7 +73,7 @@ class QV_API QvTranscoder {
     virtual void cbDone(int result);
     virtual int cbProgress(double part);  // 0 to 1; over both passes of a two-pass run
     virtual void cbPaused(bool paused);
-    virtual int cbProcess();              // after every step; non-zero ends the run as a stop does
+    virtual int cbProcess();  // after every step; non-zero ends the run as a stop does
     virtual void cbPostprocess(const Any& command);
     virtual int cbMuxClose(QvMuxer* muxer);
 

@@ -10,8 +10,8 @@
 #include <vector>
 
 #include "core/engine/qvthreads.h"
-#include "core/transcode/qvtranscodetask.h"
 #include "core/transcode/qvtranscoder.h"
+#include "core/transcode/qvtranscodetask.h"
 
 class QvMetadataFile;
 
@@ -29,8 +29,8 @@ struct QvTranscoder::Private {
     ~Private();
 
     QvTask* task = nullptr;
-    std::unique_ptr<QvTask> ownTask;   // set when the transcoder made the task itself
-    QvTask* savedTask = nullptr;       // comes back after a run with a borrowed one
+    std::unique_ptr<QvTask> ownTask;  // set when the transcoder made the task itself
+    QvTask* savedTask = nullptr;      // comes back after a run with a borrowed one
     QvDecodePipe* videoDecoder = nullptr;
     QvDecodePipe* audioDecoder = nullptr;
 
@@ -64,8 +64,8 @@ struct QvTranscoder::Private {
     void setState(int value);
     void updateState() { setState(connectedNow() ? QvTranscoder::connected : QvTranscoder::notConnected); }
     void assertIdle() const;
-    void resume();       // clears `paused` and wakes the worker
-    void waitForEnd();   // until no run is going on, and joins the worker
-    void returnTask();   // puts a saved task back
+    void resume();      // clears `paused` and wakes the worker
+    void waitForEnd();  // until no run is going on, and joins the worker
+    void returnTask();  // puts a saved task back
     bool deadLocked() const;
 };

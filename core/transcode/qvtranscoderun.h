@@ -26,11 +26,11 @@ class QvProgressReport {
   private:
     double partDone() const;
 
-    int step_ = 0;           // rounds between reports, or byTime
+    int step_ = 0;  // rounds between reports, or byTime
     int total_ = 0;
-    int counter_ = 0;        // rounds so far
+    int counter_ = 0;  // rounds so far
     int lastReported_ = -1;
-    double interval_ = 0;    // seconds, when by time
+    double interval_ = 0;  // seconds, when by time
     double lastTime_ = 0;
     double offset_ = 0, scale_ = 1;
 };
@@ -83,10 +83,10 @@ class QvTranscodeRun {
     QvTranscoder::Private& p_;
 
     std::vector<TransLink*> video_, audio_;
-    QvFramerate rate_;           // at which audio is measured against the frames written
-    long long framesDone_ = 0;   // by the video link that was worked on last
+    QvFramerate rate_;          // at which audio is measured against the frames written
+    long long framesDone_ = 0;  // by the video link that was worked on last
     int rounds_ = 0;
-    int result_ = 0;             // of the last step
+    int result_ = 0;  // of the last step
     bool endOfVideo_ = false;
     bool allDone_ = false;
     double lastTurn_ = 0;

@@ -200,7 +200,8 @@ TransLink* QvTask::getLinkForInput(QvDecodePipe* decoder, int type, int decStrea
 }
 
 int QvTask::indexOfLink(const TransLink* wanted) const {
-    const auto found = std::find_if(links_.begin(), links_.end(), [&](const auto& l) { return l.get() == wanted; });
+    const auto found =
+        std::find_if(links_.begin(), links_.end(), [&](const auto& l) { return l.get() == wanted; });
     return found == links_.end() ? -1 : static_cast<int>(found - links_.begin());
 }
 
@@ -247,8 +248,7 @@ int QvTask::setProcessParams(const ProcessParams& params, int typeMask) {
             own.set("chapters", params.get("chapters"));
         }
         if (params.get("audioChannelMap").isVector()) {
-            QV_ASSERT_MSG(type == 2,
-                          "QvTask.setProcessParams: cannot apply channelMap to non-audio stream");
+            QV_ASSERT_MSG(type == 2, "QvTask.setProcessParams: cannot apply channelMap to non-audio stream");
             own.set("audioChannelMap", params.get("audioChannelMap"));
         }
         if (params.getInt32("smartRender", 0) != 0) own.set("smartRender", params.get("smartRender"));

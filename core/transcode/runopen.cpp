@@ -205,8 +205,9 @@ void QvTranscodeRun::logSettings() const {
     if (const Any name = pipe->QvCodec::getParam("filename"); name.isString())
         log.debug("Output file: %s", name.asString());
     if (const QvPreset* preset = pipe->activePreset())
-        log.debug("Profile #%02d: '%s', %s (%d)", qv_registry()->presetMgr()->indexOfProfile(preset->profile()),
-                  preset->name(), preset->symbol(), preset->profile());
+        log.debug("Profile #%02d: '%s', %s (%d)",
+                  qv_registry()->presetMgr()->findByProfile(preset->profile()), preset->name(),
+                  preset->symbol(), preset->profile());
     else
         log.debug("Profile: n/a");
     const QvMuxer* muxer = pipe->getMuxer();

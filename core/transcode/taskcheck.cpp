@@ -93,9 +93,10 @@ int QvTask::checkMultiView() {
         const int given = viewsOf(link->decoder()->getVideoParam(link->decStreamNr(), "nrViews"));
         const int required = viewsOf(encoder->QvCodec::getParam("nrViews"));
         if (required > 1 && given < required)
-            return setError(QvStatus::notEnoughViews,
-                            "Source contains only %d view(s), encoder requires multi-view source with %d views.",
-                            given, required);
+            return setError(
+                QvStatus::notEnoughViews,
+                "Source contains only %d view(s), encoder requires multi-view source with %d views.", given,
+                required);
         if (given > required)
             qv_dbg()->warning(
                 "Source contains %d views and encoder requires %d views, views above %d will be discarded.",
@@ -132,8 +133,10 @@ int QvTask::checkDolbyPassthrough(TransLink& link, int smartRender, AnyVector& m
         const AnyDict& own = link.processParams();
         const std::string filters = soundFilters(own.isSet("filters") ? own : processParams(2));
         if (!filters.empty() && smartRender == kDolbySmartRender) {
-            text = "Not possible to use audio filters when both input and output audio formats are Dolby. "
-                   "Please remove following filters: " + filters;
+            text =
+                "Not possible to use audio filters when both input and output audio formats are Dolby. "
+                "Please remove following filters: " +
+                filters;
             verdict = QvStatus::failed;
         } else {
             if (!filters.empty())

@@ -97,9 +97,10 @@ int QvTask::openInputs(const AnyVector& files, QvDPipeList& opened, QvFileOpenCb
         if (!files.at(i).isDict()) continue;
         const AnyDict& file = files.at(i).asDict();
         const AnyDict settings = file.getDict("decoder", AnyDict());
-        QvDecodePipe* decoder = settings.get("name").isString()
-                                    ? QvDecFactory::restoreDecoder(file.get("filename"), settings, callback)
-                                    : QvDecFactory::decodePipe(file.get("filename"), Any(), callback, nullptr);
+        QvDecodePipe* decoder =
+            settings.get("name").isString()
+                ? QvDecFactory::restoreDecoder(file.get("filename"), settings, callback)
+                : QvDecFactory::decodePipe(file.get("filename"), Any(), callback, nullptr);
         Any name;
         if (decoder)
             opened.append(decoder);
