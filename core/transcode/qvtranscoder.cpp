@@ -13,7 +13,7 @@
 #include "core/engine/qvtimer.h"
 #include "core/engine/status.h"
 #include "core/media/qvgeometry.h"
-#include "core/stream/metadatafile.h"
+#include "core/stream/qvmetadatafile.h"
 #include "core/transcode/qvtranscoder_p.h"
 #include "core/transcode/qvtranscoderun.h"
 #include "core/transcode/translink.h"

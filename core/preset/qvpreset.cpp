@@ -1,0 +1,142 @@
+#include "core/preset/qvpreset.h"
+
+#include "core/engine/qvlog.h"
+#include "core/preset/qvpresetmgr.h"
+#include "core/preset/qvprofile.h"
+#include "core/value/qvassert.h"
+
+namespace {
+
+constexpr int kVideoEncoderKind = 7;
+constexpr int kAudioEncoderKind = 6;
+
+// A list of module names out of a list or a single name.
+AnyVector nameList(const Any& names) {
+    if (names.isVector()) return names.asVector();
+    AnyVector list;
+    if (names.isString()) list.append(names);
+    return list;
+}
+
+}  // namespace
+
+QvPreset::QvPreset() : QvPreset(QvProfile::notSet, "<invalid>") {}
+
+QvPreset::QvPreset(int profile, const char* name) {
+    set("__class__", "Preset");
+    set("__version__", "2.0");
+    set("custom", 1);
+    set("profile", profile);
+    set("name", name);
+}
+
+QvPreset::QvPreset(const AnyDict& dict) : AnyDict(dict) {
+    set("__class__", "Preset");
+    set("__version__", "2.0");
+    if (!isSet("custom")) set("custom", 1);
+    if (!isSet("name")) set("name", "<invalid>");
+    if (!isSet("profile")) set("profile", QvProfile::notSet);
+}
+
+QvPreset::QvPreset(int profile, const char* name, const Any& video, const Any& audio, const Any& muxers)
+    : QvPreset(profile, name) {
+    set("custom", 0);
+    set("videoCodecs", nameList(video));
+    set("audioCodecs", nameList(audio));
+    set("muxers", nameList(muxers));
+}
+
+const char* QvPreset::name() const { return getString("name", "<invalid>"); }
+const char* QvPreset::shortName() const { return getString("shortName", name()); }
+void QvPreset::setShortName(const char* name) { set("shortName", name); }
+const char* QvPreset::symbol() const { return qvProfileToSym(profile()); }
+void QvPreset::setDisabled(bool on) { set("disabled", on ? 1 : 0); }
+AnyDict QvPreset::muxerParams() const { return getDict("muxer", AnyDict()); }
+AnyVector QvPreset::programs() const { return getVector("programs", AnyVector()); }
+
+void QvPreset::setInfo(const Any& text) {
+    QV_ASSERT_MSG(text.isText(), "QvPreset.setInfo: invalid argument");
+    set("info", text);
+}
+
+void QvPreset::setName(const char* name) {
+    QV_ASSERT_MSG(isCustom(), "QvPreset.setName: allowed only for user presets");
+    QV_ASSERT_MSG(qvPresetMgr()->builtinPresets().indexOfName(name) < 0, "QvPreset.setName: name conflict.");
+    set("name", name);
+}
+
+void QvPreset::setPostprocessCmd(const Any& command) {
+    QV_ASSERT(isCustom());
+    AnyDict extension = getDict("extension", AnyDict());
+    extension.set("postprocess", command);
+    set("extension", extension);
+}
+
+Any QvPreset::postprocessCmd() const { return getDict("extension", AnyDict()).get("postprocess"); }
+
+// The built-in preset that a user preset rests on, or null with a line in the log.
+const AnyDict* QvPreset::base() const {
+    QV_ASSERT_MSG(isCustom(), "getBasePreset called on builtin preset");
+    const QvPresetList& builtin = qvPresetMgr()->builtinPresets();
+    const int index = builtin.indexOfProfile(qvFixOldProfileNo(profile()));
+    if (index >= 0) return &builtin.at(index).asDict();
+    qv_dbg()->warning("[Preset] Base preset not found for %s", name());
+    return nullptr;
+}
+
+AnyVector QvPreset::allowed(const char* key) const {
+    const AnyDict* source = isBuiltin() ? this : base();
+    return source ? source->getVector(key, AnyVector()) : AnyVector();
+}
+
+AnyVector QvPreset::codecs(int kind) const {
+    QV_ASSERT(kind == kVideoEncoderKind || kind == kAudioEncoderKind);
+    return kind == kVideoEncoderKind ? videoCodecs() : audioCodecs();
+}
+
+Any QvPreset::defaultMuxer() const {
+    if (get("muxer").isDict()) return get("muxer").asDict().get("name");
+    return muxers().at(0);
+}
+
+bool QvPreset::muxerAllowed(const char* name) const { return muxers().contains(Any(name)); }
+
+AnyDict QvPreset::streamParams(int type, int index, const char* codec) const {
+    QV_ASSERT_MSG(isCustom(), "QvPreset.streamParams: builtin presets contain no stream params");
+    QV_ASSERT(type == 1 || type == 2 || type == 4);
+    const AnyVector streams = getVector("streams", AnyVector());
+    AnyDict found;
+    int seen = 0;
+    for (int i = 0; i < streams.size() && seen <= index; ++i) {
+        if (!streams.at(i).isDict()) continue;
+        const AnyDict& stream = streams.at(i).asDict();
+        if (stream.getInt32("type", -1) != type) continue;
+        ++seen;
+        if (!codec || stream.getDict("codec", AnyDict()).get("name") == codec) found = stream;
+    }
+    return found;
+}
+
+bool QvPreset::isCompatible(const char* codec, const char* muxer) const {
+    return qvPresetMgr()->isCompatible(codec, muxer, profile());
+}
+
+AnyVector QvPreset::getCompatible(const char* name, int kind) const {
+    return qvPresetMgr()->getCompatible(name, kind, profile());
+}
+
+QvPreset QvPresetList::preset(int index) const {
+    return QvPreset(at(index).isDict() ? at(index).asDict() : AnyDict());
+}
+
+int QvPresetList::indexOfName(const char* name) const {
+    for (int i = 0; i < size(); ++i)
+        if (at(i).isDict() && at(i).asDict().get("name") == name) return i;
+    return -1;
+}
+
+int QvPresetList::indexOfProfile(int profile) const {
+    for (int i = 0; i < size(); ++i)
+        if (at(i).isDict() && at(i).asDict().getInt32("profile", QvProfile::notSet) == profile) return i;
+    return -1;
+}
