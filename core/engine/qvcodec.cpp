@@ -31,7 +31,10 @@ QvCodec::QvCodec(const QvModule* module) : module_(module) {
 }
 
 QvCodec::QvCodec(const QvCodec& other)
-    : errorText_(other.errorText_), errorCode_(other.errorCode_), state_(other.state_), module_(other.module_) {}
+    : errorText_(other.errorText_),
+      errorCode_(other.errorCode_),
+      state_(other.state_),
+      module_(other.module_) {}
 
 QvCodec& QvCodec::operator=(const QvCodec& other) {
     if (this == &other) return *this;
@@ -74,9 +77,9 @@ Any QvCodec::getParam(const char* name) const {
 
 int QvCodec::setParamDict(const AnyDict& params) {
     int result = QvStatus::ok;
-    for (int i = 0; i < params.size(); ++i) {
+    for (const auto& [key, value] : params) {
         try {
-            result |= setParam(params.getKey(i), params.getVal(i));
+            result |= setParam(key, *value);
         } catch (const QvParamException&) {
             // A name unknown to this codec doesn't keep the others from it.
         }
@@ -147,13 +150,13 @@ int QvCodec::_setErr(int code, const char* format, ...) {
 }
 
 int QvCodec::_raiseInvalidParam(const char* name) const {
-    const Any text =
-        Any::sprintf("%s::setParam - invalid parameter \"%s\"", this->name(), name ? name : "");
+    const Any text = Any::sprintf("%s::setParam - invalid parameter \"%s\"", this->name(), name ? name : "");
     qv_dbg()->debug("Exception: %s", text.asString());
     if (!throwsParamException()) return QvStatus::invalidParam;
     throw QvParamException(text.asString());
 }
 
 void QvCodec::_traceParam(const char* name, const Any& value) const {
-    if (state_ != stateCreated && tracesParams()) QvUtil::debugOutSetParam(this, name, value);
+    if (state_ != stateCreated && qv_dbg()->hasTarget() && tracesParams())
+        QvUtil::debugOutSetParam(this, name, value);
 }

@@ -9,6 +9,7 @@
 #include "core/engine/qvfileutil.h"
 #include "core/engine/qvtimer.h"
 #include "core/engine/qvutil.h"
+#include "core/engine/status.h"
 
 namespace {
 
@@ -132,7 +133,8 @@ int QvDbgLog::openTarget(Any& target) {
 }
 
 void QvDbgLog::announce(const Any& target) {
-    info("Log file version %s %s %s", "2.5.10.7839", "2011-10-12", target.asString(""));
+    info("Log file version %s %s %s", QvUtil::libraryVersion().asString(""), QvUtil::buildDate().asString(""),
+         target.asString(""));
     logs(QvLogMask::info, QvUtil::cpuDescription().asString(""));
 }
 

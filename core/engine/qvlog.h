@@ -45,6 +45,8 @@ class QV_API QvDbgLog {
     int setLogfile(Any* logfile) { return init(logfile, logger()); }
     void setLogger(QvLogBase* logger);  // null only stops the calls
     QvLogBase* logger() const;
+    // False: whatever is logged vanishes, so a caller can spare itself the text.
+    bool hasTarget() const;
 
     // Writes `text` as one line after the time, "h:mm:ss.mmm"; time and text have at most 2,047 characters.
     void logs(int mask, const char* text);
@@ -65,7 +67,6 @@ class QV_API QvDbgLog {
   private:
     QvDbgLog() = default;
     ~QvDbgLog() = default;
-    bool hasTarget() const;
     void closeStream();
     int openTarget(Any& target);
     void announce(const Any& target);

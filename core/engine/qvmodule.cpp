@@ -22,9 +22,9 @@ QvModule::~QvModule() {
     if (instances_.empty()) return;
     qv_dbg()->warning("%s: *** %d instances still alive",
                       attributes_.get(displayNameKey).asString("<unknown>"), instances_.size());
-    for (int i = 0; i < instances_.size(); ++i) {
-        instances_.at(i)->module_ = nullptr;
-        instances_.at(i)->listed_ = false;
+    for (QvCodec* codec : instances_) {
+        codec->module_ = nullptr;
+        codec->listed_ = false;
     }
 }
 
@@ -41,7 +41,7 @@ void QvModule::setAttr(const char* key, const Any& value) { attributes_.set(key,
 void QvModule::getAttrs(AnyDict& attributes) const { attributes = attributes_; }
 
 void QvModule::setAttrs(const AnyDict& attributes) {
-    for (int i = 0; i < attributes.size(); ++i) setAttr(attributes.getKey(i), attributes.getVal(i));
+    for (const auto& [key, value] : attributes) setAttr(key, *value);
 }
 
 void QvModule::enlist(QvCodec* codec) const {
@@ -68,8 +68,9 @@ QvCodec* QvModule::_setAttrs(QvCodec* codec) const {
 void QvModule::codecDeleted(QvCodec* codec) const {
     QV_ASSERT_MSG(codec && codec->module_ == this, "QvModule.codecCreated: invalid object.");
     const std::lock_guard lock(instancesLock_);
-    QV_ASSERT_MSG(instances_.contains(codec), "QvModule.releaseCodec: object not found.");
-    instances_.remove(codec);
+    const int index = instances_.indexOf(codec);
+    QV_ASSERT_MSG(index >= 0, "QvModule.releaseCodec: object not found.");
+    instances_.remove(index);
     codec->listed_ = false;
 }
 

@@ -12,7 +12,6 @@
 #include "core/engine/qvregistry_p.h"
 #include "core/engine/qvutil.h"
 #include "core/engine/status.h"
-#include "core/engine/version.h"
 #include "core/value/qvassert.h"
 
 namespace {
@@ -85,7 +84,9 @@ void QvRegistry::setDbgOption(const char* name, const Any& value) {
     p_->options.get(optionsKey).asDict().set(name, value);
 }
 
-Any QvRegistry::defaultFontFile(int monospace) const { return fontFile(faceFor(monospace, QvFontFace::sans)); }
+Any QvRegistry::defaultFontFile(int monospace) const {
+    return fontFile(faceFor(monospace, QvFontFace::sans));
+}
 
 Any QvRegistry::defaultFontFileItalic(int monospace) const {
     return fontFile(faceFor(monospace, QvFontFace::sansItalic));
@@ -119,7 +120,7 @@ int QvRegistry::scanFolder(const Any& folder) {
         qv_dbg()->debug("[Registry] No plugins found in %s", name.asString(""));
         return QvStatus::failed;
     }
-    for (int i = 0; i < files.size(); ++i) loadPlugin(files.at(i));
+    for (const Any& file : files) loadPlugin(file);
     presetMgr()->update();
     return QvStatus::ok;
 }
@@ -155,11 +156,12 @@ int QvRegistry::addPlugin(QvPlugin* plugin) {
     QV_ASSERT_MSG(plugin, "invalid ptr");
     plugin->setAttr("filename", "builtin");
     plugin->setAttr("debug", 0);
-    plugin->setAttr("version", qvEngineVersion);
-    plugin->setAttr("versionDate", qvEngineDate);
+    plugin->setAttr("version", QvUtil::libraryVersion());
+    plugin->setAttr("versionDate", QvUtil::buildDate());
     keepDefaults(*plugin);
     qv_dbg()->debug("[Registry] Added %s (%s %s), containing %d module(s)", plugin->desc().asString(""),
-                    qvEngineVersion, qvEngineDate, plugin->nrModules());
+                    QvUtil::libraryVersion().asString(""), QvUtil::buildDate().asString(""),
+                    plugin->nrModules());
     plugins_.push_back(plugin);
     return QvStatus::ok;
 }

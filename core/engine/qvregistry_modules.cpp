@@ -66,15 +66,13 @@ AnyDict changedAttributes(const QvModule& module, const AnyDict& defaults) {
     AnyDict attributes;
     module.getAttrs(attributes);
     AnyDict changed;
-    for (int i = 0; i < attributes.size(); ++i) {
-        const char* key = attributes.getKey(i);
-        if (attributes.getVal(i) != defaults.get(key)) changed.set(key, attributes.getVal(i));
-    }
+    for (const auto& [key, value] : attributes)
+        if (*value != defaults.get(key)) changed.set(key, *value);
     return changed;
 }
 
 void overrideAttributes(QvModule& module, const AnyDict& attributes) {
-    for (int i = 0; i < attributes.size(); ++i) module.setAttr(attributes.getKey(i), attributes.getVal(i));
+    for (const auto& [key, value] : attributes) module.setAttr(key, *value);
 }
 
 }  // namespace
@@ -157,16 +155,14 @@ void QvRegistry::getModuleOverrides(AnyDict& overrides) const {
 }
 
 void QvRegistry::setModuleOverrides(const AnyDict& overrides) {
-    for (int i = 0; i < overrides.size(); ++i) {
-        const char* name = overrides.getKey(i);
-        const Any& attributes = overrides.getVal(i);
+    for (const auto& [name, attributes] : overrides) {
         QvModule* found = module(name);
         if (!found)
             qv_dbg()->debug("Found overrides for module %s, but it is not loaded, skipping.", name);
-        else if (!attributes.isDict())
+        else if (!attributes->isDict())
             qv_dbg()->error("Found overrides for module %s, error in format, skipping.", name);
         else
-            overrideAttributes(*found, attributes.asDict());
+            overrideAttributes(*found, attributes->asDict());
     }
 }
 
@@ -175,13 +171,13 @@ AnyVector* QvRegistry::inputExts(bool dot, bool star) const {
     for (const QvModule* decoder : enabledDecoders(*this)) {
         const Any exts = decoder->getAttr("exts");
         if (!exts.isVector()) continue;
-        for (int i = 0; i < exts.size(); ++i)
-            if (!known.contains(exts.asVector().at(i))) known.append(exts.asVector().at(i));
+        for (const Any& ext : exts.asVector())
+            if (!known.contains(ext)) known.append(ext);
     }
     const char* format = dot && star ? "*.%s" : star ? "*%s" : dot ? ".%s" : "%s";
     auto patterns = std::make_unique<AnyVector>();
-    for (int i = 0; i < known.size(); ++i) {
-        const Any ext = known.at(i).toString();
+    for (const Any& name : known) {
+        const Any ext = name.toString();
         if (ext.isString() && ext != "*") patterns->append(Any::sprintf(format, ext.asString()));
     }
     return patterns.release();

@@ -119,7 +119,8 @@ class QV_API QvUtil {
     // --- Parameter traces, debug log (core/engine/paramtrace.cpp)
     // ---------------------------------------------- One line, and one for each element: `indent` levels of
     // two blanks, label, type, and from column `column` the value.
-    static void debugOutAny(const char* label, const Any& value, int indent = 0, int column = 40);
+    static void debugOutAny(const char* label, const Any& value, int indent = 0, int column = 40,
+                            bool recurse = true);
     static void debugOutDict(const AnyDict& dict, int indent = 0, int column = 40);
     static void debugOutVector(const AnyVector& vector, int indent = 0, int column = 40);
     static void debugOutSetParam(const QvCodec* codec, const char* name, const Any& value);

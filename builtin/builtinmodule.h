@@ -1,0 +1,30 @@
+// The module class of everything built in: a row of the table in builtin.cpp brought to life.
+#pragma once
+
+#include "core/engine/qvmodule.h"
+
+// What is fixed about a module. Lists are words between blanks.
+struct QvBuiltinRow {
+    const char* name;
+    int type;  // QvModuleType
+    const char* desc;
+    const char* displayName;
+    QvCodec* (*create)() = nullptr;  // a new codec without a module; null: this build has none
+    const char* exts = nullptr;      // extensions of a decoder; "" is an empty list, null no attribute
+    int priority = 0;                // of a decoder, the smallest is tried first; 0: no attribute
+    bool skipAuto = false;           // never chosen by extension
+    bool internal = false;           // not offered to users
+    const char* inFourcc = nullptr;  // formats that a video encoder takes, as FOURCC numbers
+};
+
+class QvBuiltinModule : public QvModule {
+  public:
+    explicit QvBuiltinModule(const QvBuiltinRow& row);  // the row outlives the module
+    QvCodec* create() override;                         // null if this build has no such codec
+
+  private:
+    const QvBuiltinRow& row_;
+};
+
+// The row of a name, also of modules that are not registered. Asserts if there is none.
+const QvBuiltinRow& qvBuiltinRow(const char* name);
