@@ -1,6 +1,8 @@
 #include "builtin/builtinmodule.h"
 
+#include <algorithm>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "core/engine/qvcodec.h"
@@ -40,11 +42,12 @@ AnyVector fourccs(const char* list) {
 
 QvBuiltinModule::QvBuiltinModule(const QvBuiltinRow& row)
     : QvModule(row.type, row.name, row.desc, row.displayName), row_(row) {
-    if (row.exts) setAttr("exts", texts(row.exts));
-    if (row.priority) setAttr("priority", row.priority);
-    if (row.skipAuto) setAttr("skipAuto", 1);
-    if (row.internal) setAttr("internal", 1);
-    if (row.inFourcc) setAttr("inFOURCC", fourccs(row.inFourcc));
+    const QvBuiltinAttributes& more = row.attributes;
+    if (more.exts) setAttr("exts", texts(more.exts));
+    if (more.priority) setAttr("priority", more.priority);
+    if (more.skipAuto) setAttr("skipAuto", 1);
+    if (more.internal) setAttr("internal", 1);
+    if (more.inFourcc) setAttr("inFOURCC", fourccs(more.inFourcc));
 }
 
 QvCodec* QvBuiltinModule::create() {

@@ -3,18 +3,22 @@
 
 #include "core/engine/qvmodule.h"
 
-// What is fixed about a module. Lists are words between blanks.
+// Further attributes of a module. Lists are words between blanks.
+struct QvBuiltinAttributes {
+    const char* exts = nullptr;      // extensions of a decoder; "" is an empty list, null no attribute
+    int priority = 0;                // of a decoder, the smallest is tried first; 0: no attribute
+    bool skipAuto = false;           // never chosen by extension
+    bool internal = false;           // not offered to users
+    const char* inFourcc = nullptr;  // formats that a video encoder takes, stored as FOURCC numbers
+};
+
 struct QvBuiltinRow {
     const char* name;
     int type;  // QvModuleType
     const char* desc;
     const char* displayName;
-    QvCodec* (*create)() = nullptr;  // a new codec without a module; null: this build has none
-    const char* exts = nullptr;      // extensions of a decoder; "" is an empty list, null no attribute
-    int priority = 0;                // of a decoder, the smallest is tried first; 0: no attribute
-    bool skipAuto = false;           // never chosen by extension
-    bool internal = false;           // not offered to users
-    const char* inFourcc = nullptr;  // formats that a video encoder takes, as FOURCC numbers
+    QvCodec* (*create)();  // a new codec without a module; null: this build has none
+    QvBuiltinAttributes attributes = {};
 };
 
 class QvBuiltinModule : public QvModule {
