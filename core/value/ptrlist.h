@@ -1,0 +1,96 @@
+// Lists of pointers that own nothing: clearing or destroying a list never touches what it points to.
+#pragma once
+
+#include <cstddef>
+#include <iterator>
+#include <vector>
+
+#include "core/arch/api.h"
+
+class AnyVector;
+
+// The untyped list behind TPtrList and TRefList. Copies share the pointees.
+class QV_API PtrListImp {
+  public:
+    PtrListImp() noexcept;
+    // Takes the pointer that each element holds, as toVector() gives them.
+    explicit PtrListImp(const AnyVector& pointers);
+    PtrListImp(const PtrListImp& other);
+    PtrListImp(PtrListImp&& other) noexcept;
+    virtual ~PtrListImp();
+    PtrListImp& operator=(const PtrListImp& other);
+    PtrListImp& operator=(PtrListImp&& other) noexcept;
+
+    int size() const { return array_ ? static_cast<int>(array_->size()) : 0; }
+    bool empty() const { return size() == 0; }
+    void clear();  // keeps the array for the next use
+    // A Generic of size 0, a borrowed pointer, for each entry.
+    AnyVector toVector() const;
+
+  protected:
+    void append(void* pointer);
+    void* at(int index) const;              // an assertion outside the range
+    void set(int index, void* pointer);     // an assertion outside the range
+    void insert(int index, void* pointer);  // in front of `index`; -1 appends; else an assertion
+    void* remove(int index);                // what was taken out, null outside the range
+    int find(const void* pointer) const;    // the first index, or -1
+    void* const* data() const { return array_ ? array_->data() : nullptr; }
+
+  private:
+    std::vector<void*>* array_ = nullptr;  // made with the first entry
+
+    std::vector<void*>& array();
+};
+
+// Objects that somebody else will delete.
+template <class T>
+class TPtrList : public PtrListImp {
+  public:
+    TPtrList() = default;
+    explicit TPtrList(const AnyVector& pointers) : PtrListImp(pointers) {}
+
+    void append(T* object) { PtrListImp::append(untyped(object)); }
+    void insert(int index, T* object) { PtrListImp::insert(index, untyped(object)); }
+    void set(int index, T* object) { PtrListImp::set(index, untyped(object)); }
+    T* at(int index) const { return static_cast<T*>(PtrListImp::at(index)); }
+    T* operator[](int index) const { return at(index); }
+    T* back() const { return at(size() - 1); }  // an assertion on an empty list
+    T* remove(int index) { return static_cast<T*>(PtrListImp::remove(index)); }
+    int indexOf(const T* object) const { return PtrListImp::find(object); }
+    bool contains(const T* object) const { return indexOf(object) >= 0; }
+
+    class const_iterator {
+      public:
+        using iterator_category = std::forward_iterator_tag;
+        using value_type = T*;
+        using difference_type = std::ptrdiff_t;
+        using pointer = T* const*;
+        using reference = T*;
+
+        const_iterator() = default;
+        explicit const_iterator(void* const* position) : position_(position) {}
+        T* operator*() const { return static_cast<T*>(*position_); }
+        const_iterator& operator++() {
+            ++position_;
+            return *this;
+        }
+        const_iterator operator++(int) { return const_iterator(position_++); }
+        bool operator==(const const_iterator&) const = default;
+
+      private:
+        void* const* position_ = nullptr;
+    };
+    using iterator = const_iterator;
+    const_iterator begin() const { return const_iterator(data()); }
+    const_iterator end() const { return const_iterator(data() + size()); }
+
+  private:
+    static void* untyped(const T* object) { return const_cast<void*>(static_cast<const void*>(object)); }
+};
+
+// A view of objects that live inside a dictionary or another structure.
+template <class T>
+class TRefList : public TPtrList<T> {
+  public:
+    using TPtrList<T>::TPtrList;
+};
