@@ -76,6 +76,7 @@ class QvTranscodeRun {
     void callProcess();
     int checkDisc();
     void logTurn();
+    void forgetStatistics();
     void stopLoop() { p_.stopRequested = true; }
     bool stopping() const { return p_.stopRequested.load(std::memory_order_relaxed); }
 

@@ -5,6 +5,7 @@
 #include <string_view>
 
 #include "core/encode/qvencodepipe.h"
+#include "core/encode/qvencoder.h"
 #include "core/encode/qvmuxer.h"
 #include "core/engine/qvexception.h"
 #include "core/engine/qvfileutil.h"
@@ -134,9 +135,23 @@ int QvTranscodeRun::mainLoop() {
         ++rounds_;
     } while (!allDone_);
     if (result_ == QvStatus::ok) checkDisc();
+    if (p_.twoPass) forgetStatistics();
     if (!endOfVideo_ || result_ != QvStatus::endOfStream) return result_;
     p_.stopRequested = false;  // the loop asked for it, nobody else
     return QvStatus::ok;
+}
+
+// The files of the first pass go with the run, so no encoder may keep pointing at them.
+void QvTranscodeRun::forgetStatistics() {
+    for (TransLink* video : video_) {
+        try {
+            p_.task->encoder()
+                ->videoEncoder(video->encStreamNr())
+                ->setParam("meta", Any(static_cast<const void*>(nullptr)));
+        } catch (const QvParamException&) {
+            // An encoder without statistics has nothing to forget.
+        }
+    }
 }
 
 void QvTranscodeRun::link(TransLink& link, int n) {

@@ -5,10 +5,10 @@
 #include "core/encode/qvencodepipe.h"
 #include "core/encode/qvencoder.h"
 #include "core/encode/qvmuxer.h"
-#include "core/engine/paramtrace.h"
 #include "core/engine/qvexception.h"
 #include "core/engine/qvlog.h"
 #include "core/engine/qvregistry.h"
+#include "core/engine/qvutil.h"
 #include "core/engine/status.h"
 #include "core/preset/qvpreset.h"
 #include "core/preset/qvpresetmgr.h"
@@ -222,7 +222,7 @@ void QvTranscodeRun::logSettings() const {
         AnyDict settings;
         muxer->store(settings);
         log.debug("Muxer:");
-        qvDebugOutDict("", settings);
+        QvUtil::debugOutDict(settings);
     }
     const auto links = p_.task->links();
     for (int i = 0; i < links.size(); ++i) links.at(i)->log();

@@ -5,7 +5,7 @@
 #include "core/decode/decodefactory.h"
 #include "core/decode/qvdecoder.h"
 #include "core/encode/qvencodepipe.h"
-#include "core/engine/paramtrace.h"
+#include "core/engine/qvutil.h"
 #include "core/engine/qvlog.h"
 #include "core/engine/status.h"
 #include "core/transcode/qvtranscodetask.h"
@@ -121,7 +121,7 @@ int QvTask::restore(const AnyDict& state, QvDPipeList& decoders, QvEncodePipe** 
     const bool hasStreams = settings.isDict() && settings.asDict().get("streams").isVector() &&
                             !settings.asDict().get("streams").asVector().empty();
     if (!settings.isDict() || settings.asDict().empty()) {
-        qvDebugOutDict("Task.restore", state);
+        QvUtil::debugOutDict(state);
         return setError(QvStatus::invalidStructure,
                         "Task.restore: Invalid task state structure - missing encoder settings");
     }
