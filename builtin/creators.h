@@ -5,4 +5,5 @@
 #pragma once
 
 class QvCodec;
-
+QvCodec* newRawdec();
+QvCodec* newWavdec();

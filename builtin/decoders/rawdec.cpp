@@ -5,7 +5,9 @@
 #include <limits>
 #include <utility>
 
+#include "builtin/creators.h"
 #include "core/engine/params.h"
+#include "core/engine/qvmodule.h"
 #include "core/engine/qvregistry.h"
 #include "core/engine/status.h"
 #include "core/filter/qvfilter.h"
@@ -16,13 +18,7 @@ namespace {
 using Settings = RawDecoder::Settings;
 
 constexpr std::size_t readAhead = 4096;
-constexpr const char* deliveredForV210 = "Y216";
-
-unsigned codeOf(const char* text) {
-    unsigned code = 0;
-    std::memcpy(&code, text, sizeof code);
-    return code;
-}
+constexpr unsigned deliveredForV210 = QvFourcc::Y216;
 
 int setFramerate(Settings& settings, const Any& value) {
     if (value.isFramerate()) {
@@ -69,7 +65,7 @@ RawDecoder::~RawDecoder() = default;
 
 int RawDecoder::init() {
     if (const int result = QvDecodePipe::init(); result != QvStatus::ok) return result;
-    return changeFormat("BGR4");
+    return changeFormat(QvFourcc::BGR4);
 }
 
 // --- Parameters.
@@ -91,35 +87,31 @@ int RawDecoder::setParam(const char* name, const Any& value) {
 }
 
 int RawDecoder::setFOURCC(const Any& value) {
-    char code[5] = {};
-    if (value.isInt()) {
-        const auto number = static_cast<unsigned>(value.toInt32());
-        std::memcpy(code, &number, 4);
-    } else if (value.isString() && value.size() >= 4) {
-        std::memcpy(code, value.asString(), 4);
-    } else {
-        return setError(QvStatus::invalidParam, "Invalid value of parameter '%s'", "FOURCC");
-    }
-    return extendedFOURCC_ == code ? QvStatus::ok : changeFormat(code);
+    unsigned code = 0;
+    if (value.isInt())
+        code = static_cast<unsigned>(value.toInt32());
+    else if (value.isString() && value.size() >= 4)
+        std::memcpy(&code, value.asString(), sizeof code);
+    return code == extendedFOURCC_ ? QvStatus::ok : changeFormat(code);
 }
 
-int RawDecoder::changeFormat(const std::string& code) {
+int RawDecoder::changeFormat(unsigned code) {
     FileFormat format = FileFormat::plain;
-    const char* frameCode = code.c_str();
-    if (code == "BGR6") {
+    unsigned frameCode = code;
+    if (code == qvFourcc("BGR6")) {
         format = FileFormat::rgb48;
-        frameCode = "BGR3";
-    } else if (code == "BGRU") {
+        frameCode = QvFourcc::BGR3;
+    } else if (code == qvFourcc("BGRU")) {
         format = FileFormat::rgbUnpadded;
-        frameCode = "BGR3";
-    } else if (code == "v210") {
+        frameCode = QvFourcc::BGR3;
+    } else if (code == QvFourcc::v210) {
         format = FileFormat::v210;
     }
-    QvFrame probe;  // an unknown code asserts here, with nothing changed
-    probe.init(codeOf(frameCode), 16, 16);
+    if (!qvPixelFormat(frameCode))
+        return setError(QvStatus::invalidParam, "Unknown fourCC :%s", qvFourccText(code).data());
     extendedFOURCC_ = code;
     fileFormat_ = format;
-    fourcc_ = codeOf(frameCode);
+    fourcc_ = frameCode;
     return makeFrame();
 }
 
@@ -136,26 +128,23 @@ int RawDecoder::changeSettings(const Settings& changed) {
 // Without a frame the decoder does not open: a refused size must not end in pictures of another one.
 int RawDecoder::makeFrame() {
     frame_.destroy();
-    const long long width = settings_.width;
-    const long long height = settings_.height;
-    // No format takes more than 8 bytes a pixel; v210 pads to 48 pixels.
-    const bool fits = (width + 48) * 8 * height < std::numeric_limits<int>::max();
-    if (width < 1 || height < 1 || !fits)
+    const bool inited = settings_.width > 0 && settings_.height > 0 &&
+                        frame_.init(fourcc_, settings_.width, settings_.height) == QvStatus::ok;
+    if (!inited || frame_.total_bytes() == 0) {
+        frame_.destroy();
         return setError(QvStatus::invalidParam, "Invalid frame size %dx%d", settings_.width,
                         settings_.height);
-    if (frame_.init(fourcc_, settings_.width, settings_.height) != 0)
-        return setError(QvStatus::outOfMemory, "Out of memory");
+    }
     makeFields();
     if (getState() != stateOpen) return QvStatus::ok;
     const int result = makeConverter();
     return result == QvStatus::ok ? rewind() : result;
 }
 
-int RawDecoder::makeFields() {
+void RawDecoder::makeFields() {
     for (QvFrame& field : fields_) field.destroy();
-    if (!isFieldFile() || frame_.planes() == 0) return QvStatus::ok;
+    if (!isFieldFile() || !frame_.inited()) return;
     for (QvFrame& field : fields_) field.init(fourcc_, settings_.width, settings_.height / 2);
-    return QvStatus::ok;
 }
 
 int RawDecoder::makeConverter() {
@@ -166,7 +155,7 @@ int RawDecoder::makeConverter() {
         return setError(QvStatus::failed, "media dec: no converter for v210");
     converter->setParam("outWidth", settings_.width);
     converter->setParam("outHeight", settings_.height);
-    converter->setParam("FOURCC", deliveredForV210);
+    converter->setParam("FOURCC", Any(static_cast<int>(deliveredForV210)));
     if (const int result = converter->open(); result != QvStatus::ok)
         return setError(QvStatus::failed, "media dec: no converter for v210");
     converter_ = std::move(converter);
@@ -189,9 +178,9 @@ void RawDecoder::getParam(const char* name, Any& value) const {
     else if (is("filesize"))
         value = file_.length();
     else if (is("extendedFOURCC"))
-        value = extendedFOURCC_.c_str();
+        value = qvFourccText(extendedFOURCC_).data();
     else if (is("typeName"))
-        value = extendedFOURCC_.c_str();
+        value = qvFourccText(extendedFOURCC_).data();
     else if (is("instantSeek"))
         value = seekable_ ? 1 : 0;
     else if (is("notSeekable"))
@@ -211,7 +200,7 @@ void RawDecoder::getParam(const char* name, Any& value) const {
 }
 
 void RawDecoder::storeSettings(AnyDict& dict) const {
-    dict.set("FOURCC", Any(extendedFOURCC_.c_str()));
+    dict.set("FOURCC", Any(qvFourccText(extendedFOURCC_).data()));
     dict.set("width", Any(settings_.width));
     dict.set("height", Any(settings_.height));
     dict.set("framerate", Any(settings_.framerate));
@@ -238,7 +227,7 @@ int RawDecoder::open() {
     if (getState() != stateInitialised) return setError(QvStatus::failed, "Codec not inited");
     if (!filename_.isText() || filename_.size() == 0)
         return setError(QvStatus::failed, "media dec: filename not set");
-    if (frame_.planes() == 0)
+    if (!frame_.inited())
         return setError(QvStatus::failed, "Invalid frame size %dx%d", settings_.width, settings_.height);
     if (isFieldFile() && 2LL * fields_[0].total_bytes() != frame_.total_bytes())
         return setError(QvStatus::failed, "Frames of %dx%d can not be read by fields", settings_.width,
@@ -268,7 +257,7 @@ int RawDecoder::close() {
 // --- The stream.
 
 long long RawDecoder::frameBytes() const {
-    if (frame_.planes() == 0) return 0;
+    if (!frame_.inited()) return 0;
     switch (fileFormat_) {
         case FileFormat::rgb48: return 2LL * frame_.total_bytes();
         case FileFormat::rgbUnpadded: return 3LL * settings_.width * settings_.height;
@@ -296,14 +285,14 @@ int RawDecoder::nrFrames(int stream) const {
 
 void RawDecoder::getStreamParams(int type, int stream, AnyDict& params) const {
     params.clear();
-    if (type == qvVideoStream && stream == 0 && frame_.planes() > 0) describe(params);
+    if (type == qvVideoStream && stream == 0 && frame_.inited()) describe(params);
 }
 
 void RawDecoder::describe(AnyDict& params) const {
     const int frames = nrFrames(0);
     const double rate = settings_.framerate.rate();
     const bool v210 = fileFormat_ == FileFormat::v210;
-    params.set("FOURCC", Any(static_cast<int>(v210 ? codeOf(deliveredForV210) : fourcc_)));
+    params.set("FOURCC", Any(static_cast<int>(v210 ? deliveredForV210 : fourcc_)));
     params.set("width", Any(settings_.width));
     params.set("height", Any(settings_.height));
     params.set("framerate", Any(settings_.framerate));
@@ -311,8 +300,8 @@ void RawDecoder::describe(AnyDict& params) const {
     params.set("pixelAspect", Any(frameAspect() * settings_.height / settings_.width));
     params.set("frames", Any(frames));
     params.set("duration", Any(frames / rate));
-    params.set("codec", Any(extendedFOURCC_.c_str()));
-    params.set("videoCodec", Any(extendedFOURCC_.c_str()));
+    params.set("codec", Any(qvFourccText(extendedFOURCC_).data()));
+    params.set("videoCodec", Any(qvFourccText(extendedFOURCC_).data()));
     params.set("vBitrate", Any(static_cast<double>(frameBytes()) * 8 * rate));
     params.set("nrViews", Any(1));
     params.set("pal", Any(settings_.framerate.isPAL() ? 1 : 0));
@@ -358,9 +347,7 @@ QvPcm* RawDecoder::getAudioPtr(int) { return nullptr; }
 
 int RawDecoder::readSamples(int, int) { return setError(QvStatus::notSupported, "Invalid stream nr"); }
 
-int RawDecoder::seekToSample(long long, int) {
-    return setError(QvStatus::notSupported, "Invalid stream nr");
-}
+int RawDecoder::seekToSample(long long, int) { return setError(QvStatus::notSupported, "Invalid stream nr"); }
 
 // --- Reading.
 
@@ -413,19 +400,18 @@ int RawDecoder::readImage(QvFrame& to) {
     }
     if (settings_.invert) return readRows(to);
     const auto bytes = static_cast<std::size_t>(to.total_bytes());
-    return file_.read(to.plane(0, false), 1, bytes) == bytes ? QvStatus::ok
-                                                              : setError(QvStatus::failed, "fread() failed");
+    return file_.read(to.plane(0), 1, bytes) == bytes ? QvStatus::ok
+                                                      : setError(QvStatus::failed, "fread() failed");
 }
 
 // The file's first row becomes the last one of its plane.
 int RawDecoder::readRows(QvFrame& to) {
     for (int plane = 0; plane < to.planes(); ++plane) {
-        const auto rowBytes = static_cast<std::size_t>(to.stride(plane, false));
-        const int rows = to.plane_bytes(plane) / to.stride(plane, false);
+        const auto rowBytes = static_cast<std::size_t>(to.stride(plane));
+        const int rows = to.plane_bytes(plane) / to.stride(plane);
         unsigned char* row = to.plane(plane, true);
         for (int y = 0; y < rows; ++y, row += to.stride(plane, true))
-            if (file_.read(row, 1, rowBytes) != rowBytes)
-                return setError(QvStatus::failed, "fread() failed");
+            if (file_.read(row, 1, rowBytes) != rowBytes) return setError(QvStatus::failed, "fread() failed");
     }
     return QvStatus::ok;
 }
@@ -433,7 +419,7 @@ int RawDecoder::readRows(QvFrame& to) {
 // BGR3 frames from pixels of three bytes without padding of rows, or of 16-bit components with it.
 int RawDecoder::readPacked(QvFrame& to) {
     const bool deep = fileFormat_ == FileFormat::rgb48;
-    const int rowBytes = deep ? to.stride(0, false) : 3 * to.width(0);
+    const int rowBytes = deep ? to.stride(0) : 3 * to.width(0);
     const std::size_t fileRow = static_cast<std::size_t>(rowBytes) * (deep ? 2 : 1);
     const std::size_t bytes = fileRow * static_cast<std::size_t>(to.height(0));
     readBuffer_.resize(bytes);
@@ -460,15 +446,4 @@ int RawDecoder::convert() {
     return filter->next();
 }
 
-RawDecoderModule::RawDecoderModule()
-    : QvModule(QvModuleType::decoder, "rawdec", "Raw video file reader", "Raw file import") {
-    AnyVector exts;
-    for (const char* ext : {"raw", "rgb", "yuv", "i420", "yv12", "yuy2", "yuyv", "bgr4", "bgr3", "bgra",
-                            "rgb3", "rgb4", "argb", "v210"})
-        exts.append(Any(ext));
-    setAttr("exts", exts);
-    setAttr("skipAuto", 1);
-    setAttr("priority", 10);
-}
-
-QvCodec* RawDecoderModule::create() { return _setAttrs(new RawDecoder); }
+QvCodec* newRawdec() { return new RawDecoder; }

@@ -15,12 +15,10 @@
 #pragma once
 
 #include <memory>
-#include <string>
 #include <vector>
 
 #include "builtin/decoders/inputfile.h"
 #include "core/decode/qvdecoder.h"
-#include "core/engine/qvmodule.h"
 #include "core/media/qvbuffer.h"
 
 class RawDecoder : public QvDecodePipe {
@@ -69,10 +67,10 @@ class RawDecoder : public QvDecodePipe {
     Any filename_;
     InputFile file_;
     Settings settings_;
-    std::string extendedFOURCC_ = "BGR4";
+    unsigned extendedFOURCC_ = QvFourcc::BGR4;  // of the file
     FileFormat fileFormat_ = FileFormat::plain;
-    unsigned fourcc_ = 0;  // of the frames that are read, which v210 is before its conversion
-    int frameNr_ = -1;     // of the current frame
+    unsigned fourcc_ = 0;   // of the frames that are read, which v210 is before its conversion
+    int frameNr_ = -1;      // of the current frame
     bool pending_ = false;  // the current frame is in place and not yet read
     bool seekable_ = false;
     bool selected_ = false;
@@ -83,10 +81,10 @@ class RawDecoder : public QvDecodePipe {
     QvFrame converted_;
 
     int setFOURCC(const Any& value);
-    int changeFormat(const std::string& code);
+    int changeFormat(unsigned code);
     int changeSettings(const Settings& changed);
     int makeFrame();
-    int makeFields();
+    void makeFields();
     int makeConverter();
     int rewind();
 
@@ -103,10 +101,4 @@ class RawDecoder : public QvDecodePipe {
     int refuse(int stream);
     void describe(AnyDict& params) const;
     void storeSettings(AnyDict& dict) const;
-};
-
-class RawDecoderModule : public QvModule {
-  public:
-    RawDecoderModule();
-    QvCodec* create() override;
 };

@@ -5,6 +5,7 @@
 #include <limits>
 #include <utility>
 
+#include "builtin/creators.h"
 #include "core/engine/status.h"
 #include "core/media/qvbuffer.h"
 #include "core/value/qvassert.h"
@@ -48,29 +49,29 @@ WavStream::WavStream(InputFile file, const WavHeader& header) : header_(header),
 }
 
 int WavStream::read(int count) {
-    const long long left = header_.samples - pcm->position;
+    const long long left = header_.samples - pcm->position();
     const int most = std::numeric_limits<int>::max() / header_.frameBytes();  // a buffer has 31 bits of bytes
     count = static_cast<int>(std::min<long long>({count, left, most}));
     if (count <= 0) {
-        pcm->samples = 0;
+        pcm->setSamples(0);
         return QvStatus::endOfStream;
     }
-    if (count > pcm->size) pcm->grow(count - pcm->size);
+    if (count > pcm->size() && pcm->grow(count - pcm->size()) < 0) return QvStatus::outOfMemory;
     const auto channels = static_cast<std::size_t>(header_.channels);
     const auto values = static_cast<std::size_t>(count) * channels;
-    const std::size_t got = file_.read(pcm->ptr(0), static_cast<std::size_t>(pcm->bytesPerSample), values);
-    pcm->samples = static_cast<int>(got / channels);
-    pcm->position += pcm->samples;
-    return pcm->samples > 0 ? pcm->samples : QvStatus::cannotParse;
+    const std::size_t got = file_.read(pcm->ptr(0), static_cast<std::size_t>(pcm->bytesPerSample()), values);
+    pcm->setSamples(static_cast<int>(got / channels));
+    pcm->setPosition(pcm->position() + pcm->samples());
+    return pcm->samples() > 0 ? pcm->samples() : QvStatus::cannotParse;
 }
 
 int WavStream::seek(long long sample) {
-    pcm->samples = 0;
+    pcm->setSamples(0);
     // Behind the end there is nothing to read, so the file need not move.
     const long long within = std::min(sample, header_.samples);
     if (within < 0 || !file_.seek(header_.dataOffset + within * header_.frameBytes()))
         return QvStatus::endOfStream;
-    pcm->position = sample;
+    pcm->setPosition(sample);
     return QvStatus::ok;
 }
 
@@ -85,8 +86,8 @@ int WavDec::open() {
     if (getState() == stateOpen) close();
     InputFile file;
     WavHeader header;
-    const auto status =
-        file.open(filename(), readAhead) == QvStatus::ok ? readWavHeader(file, header) : WavStatus::cannotOpen;
+    const auto status = file.open(filename(), readAhead) == QvStatus::ok ? readWavHeader(file, header)
+                                                                         : WavStatus::cannotOpen;
     if (status != WavStatus::ok) {
         const Refusal refusal = refusalFor(status);
         return setError(refusal.code, "%s", refusal.text);
@@ -115,10 +116,4 @@ int WavDec::seekToSample(long long sample, int stream) { return wavStream(stream
 
 QvPcm* WavDec::getAudioPtr(int stream) { return wavStream(stream).pcm.get(); }
 
-WavDecModule::WavDecModule()
-    : QvModule(QvModuleType::decoder, "wavdec", "WAV file import", "WAV file import") {
-    setAttr("exts", AnyVector("wav"));
-    setAttr("priority", 10);
-}
-
-QvCodec* WavDecModule::create() { return _setAttrs(new WavDec); }
+QvCodec* newWavdec() { return new WavDec; }

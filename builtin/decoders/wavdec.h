@@ -4,7 +4,6 @@
 #include "builtin/decoders/inputfile.h"
 #include "builtin/decoders/wavf.h"
 #include "core/decode/basedecodepipe.h"
-#include "core/engine/qvmodule.h"
 
 class WavStream : public DPipeAudioStream {
   public:
@@ -36,10 +35,4 @@ class WavDec : public BaseDecodePipe {
     long long fileSize_ = 0;
 
     WavStream& wavStream(int stream) const;
-};
-
-class WavDecModule : public QvModule {
-  public:
-    WavDecModule();
-    QvCodec* create() override;
 };

@@ -168,8 +168,7 @@ bool HeaderReader::findDataBySearch() {
 }
 
 WavStatus HeaderReader::checkFormat() const {
-    const bool pcm =
-        header_.formatTag == 1 || (header_.formatTag == extensibleTag && subFormat_ == 1);
+    const bool pcm = header_.formatTag == 1 || (header_.formatTag == extensibleTag && subFormat_ == 1);
     if (!pcm) return WavStatus::notPcm;
     const bool width =
         header_.bitsPerSample == 8 || header_.bitsPerSample == 16 || header_.bitsPerSample == 24;
@@ -193,8 +192,7 @@ bool HeaderReader::sizeIsUnknown(std::uint32_t size, long long present) {
     if (size == 0) return !chunksFillTheRest(header_.dataOffset);
     if (std::find(std::begin(placeholders), std::end(placeholders), size) != std::end(placeholders))
         return true;
-    return present > std::numeric_limits<std::uint32_t>::max() &&
-           static_cast<std::uint32_t>(present) == size;
+    return present > std::numeric_limits<std::uint32_t>::max() && static_cast<std::uint32_t>(present) == size;
 }
 
 void HeaderReader::measure() {

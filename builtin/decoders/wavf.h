@@ -18,14 +18,14 @@ enum class WavStatus {
     notPcm = 2,     // neither PCM nor extensible PCM
     badFormat = 3,  // a count of channels, a rate or a width that can't be read
     cannotParse = 4,
-    noData = 9,     // no "data" near behind the format; counts as one that can't be parsed
+    noData = 9,  // no "data" near behind the format; counts as one that can't be parsed
 };
 
 struct WavHeader {
-    long long fileSize = 0;  // bytes, as the RIFF header says, but never more than there are
-    int channels = 0;        // 1 .. 8
-    int samplerate = 0;      // above 0
-    long long samples = 0;   // that the file holds
+    long long fileSize = 0;          // bytes, as the RIFF header says, but never more than there are
+    int channels = 0;                // 1 .. 8
+    int samplerate = 0;              // above 0
+    long long samples = 0;           // that the file holds
     long long samplesAnnounced = 0;  // at least `samples`; more in a file that was cut
     int bitsPerSample = 0;           // 8, 16 or 24
     int formatTag = 0;               // 1, or 65534 for extensible

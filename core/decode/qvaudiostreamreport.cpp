@@ -40,8 +40,8 @@ int peakOfTriples(const unsigned char* from, std::size_t count) {
 
 int peakOf(const QvPcm& pcm) {
     const unsigned char* from = pcm.ptr(0);
-    const auto count = static_cast<std::size_t>(pcm.samples) * static_cast<std::size_t>(pcm.channels);
-    switch (pcm.bytesPerSample) {
+    const auto count = static_cast<std::size_t>(pcm.samples()) * static_cast<std::size_t>(pcm.channels());
+    switch (pcm.bytesPerSample()) {
         case 1: return peakOfBytes(from, count);
         case 2: return peakOfWords(from, count);
         case 3: return peakOfTriples(from, count);
@@ -71,9 +71,9 @@ int QvAudioStreamReport::init(long long total, int channels, int samplerate, int
 int QvAudioStreamReport::processGroup(const QvPcm& pcm) {
     const long long group = samplesProcessed_ / groupSamples;
     if (group >= nrGroups()) return QvStatus::failed;
-    const int peak = pcm.samples > 0 ? peakOf(pcm) : 0;
+    const int peak = pcm.samples() > 0 ? peakOf(pcm) : 0;
     peaks_[static_cast<std::size_t>(group)] = static_cast<std::uint16_t>(peak);
-    samplesProcessed_ += pcm.samples;
+    samplesProcessed_ += pcm.samples();
     return QvStatus::ok;
 }
 

@@ -358,7 +358,7 @@ std::unique_ptr<QvAudioStreamReport> QvDecodePipe::makeReport(int stream) {
         if (result < 0 && result != QvStatus::endOfStream) return nullptr;
         const QvPcm* pcm = getAudioPtr(stream);
         if (!pcm) return nullptr;
-        QV_ASSERT(result == QvStatus::endOfStream || pcm->samples == count);
+        QV_ASSERT(result == QvStatus::endOfStream || pcm->samples() == count);
         report->processGroup(*pcm);
     }
     return report;
