@@ -5,5 +5,4 @@
 #pragma once
 
 class QvCodec;
-QvCodec* newRawdec();
-QvCodec* newWavdec();
+
