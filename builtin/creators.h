@@ -5,4 +5,14 @@
 #pragma once
 
 class QvCodec;
-
+QvCodec* newRawdec();
+QvCodec* newWavdec();
+QvCodec* newFilesink();
+QvCodec* newNullsink();
+QvCodec* newDummyaenc();
+QvCodec* newRawmux();
+QvCodec* newRawvenc();
+QvCodec* newRawaenc();
+QvCodec* newNullmux();
+QvCodec* newMemmux();
+QvCodec* newMemsink();

@@ -13,9 +13,8 @@ struct QV_API QvFileOpenCbData {
 };
 
 // An application derives from it what it wants to know. Results are ignored. The calls come on the thread
-// that opens the file.
+// that opens the file. There is no virtual destructor, which would take a slot: delete by the derived type.
 struct QV_API QvFileOpenCb {
-    virtual ~QvFileOpenCb();
     // Before a decoder is tried; also, once, for a file that no decoder takes.
     virtual int fileOpenStarted(QvFileOpenCbData& data);
     // After each failed try with -1, and with 0 after the success: one file can fail several times and then

@@ -8,7 +8,9 @@
 // drives it; one that runs a worker of its own behind writeFrame owns that synchronisation.
 #pragma once
 
+#include "core/encode/codecstate.h"
 #include "core/engine/qvcodec.h"
+#include "core/engine/status.h"
 
 class QvBufStream;
 class QvFrame;

@@ -1,7 +1,9 @@
 // Contract of a sink: where the output stream of a multiplexer ends.
 #pragma once
 
+#include "core/encode/codecstate.h"
 #include "core/engine/qvcodec.h"
+#include "core/engine/status.h"
 
 class QvBufStream;
 

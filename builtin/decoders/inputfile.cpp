@@ -1,0 +1,21 @@
+#include "builtin/decoders/inputfile.h"
+
+#include "core/engine/qvfileutil.h"
+#include "core/engine/status.h"
+#include "core/value/any.h"
+
+int InputFile::open(const Any& name, std::size_t bufferBytes) {
+    close();
+    if (!name.isText() || name.size() == 0) return QvStatus::failed;
+    file_.reset(static_cast<std::FILE*>(qvfopen(name, "rb")));
+    if (!file_) return QvStatus::failed;
+    std::setvbuf(file_.get(), nullptr, _IOFBF, bufferBytes);
+    length_ = QvFile::flength(file_.get());
+    if (length_ >= 0) return QvStatus::ok;
+    close();
+    return QvStatus::failed;
+}
+
+bool InputFile::seek(long long position) {
+    return position >= 0 && QvFile::fseek64(file_.get(), position, SEEK_SET) == 0;
+}

@@ -1,0 +1,124 @@
+#include "builtin/encoders/rawaenc.h"
+
+#include <algorithm>
+
+#include "builtin/creators.h"
+#include "builtin/encoders/muxerof.h"
+#include "builtin/encoders/rawoutput.h"
+#include "core/engine/qvexception.h"
+#include "core/engine/qvlog.h"
+#include "core/media/qvbuffer.h"
+#include "core/stream/auxinfoid.h"
+#include "core/stream/qvbufstrm.h"
+#include "core/value/qvassert.h"
+
+namespace {
+
+constexpr unsigned announcedInfoBytes = 16;
+
+}  // namespace
+
+RawAudioEnc::~RawAudioEnc() {
+    try {
+        close();
+    } catch (const QvException& failure) {
+        qv_dbg()->error("[%s] %s", name(), failure.what());
+    }
+}
+
+int RawAudioEnc::attachOutStream(QvBufStream* stream) {
+    QV_ASSERT_MSG(getState() != stateCreated, "not inited");
+    return QvAudioEncoder::attachOutStream(stream);
+}
+
+int RawAudioEnc::open() {
+    QV_ASSERT_MSG(getState() == stateInitialised, "not inited");
+    if (!outStream()) return setError(QvStatus::failed, "Output stream not attached");
+    const auto* muxer = qvMuxerOf(*outStream());
+    muxer_ = muxer ? muxer->name() : "N/A";
+    outStream()->setParam("rawaenc.audioSettings", AnyDict("samplerate", samplerate_, "channels", channels_,
+                                                           "bits_per_sample", bitsPerSample_));
+    headerDue_ = true;
+    setState(qvStateOpen);
+    return QvStatus::ok;
+}
+
+int RawAudioEnc::writePcm(QvPcm* pcm, int samples) {
+    if (getState() != qvStateOpen) return setError(QvStatus::illegalState, "Not opened");
+    if (!pcm) return setError(QvStatus::invalidArgument, "No samples given");
+    if (samples < 0) samples = pcm->samples();
+    if (samples > pcm->samples())
+        return setError(QvStatus::invalidArgument, "%d samples asked for, %d given", samples, pcm->samples());
+    if (pcm->channels() * pcm->bytesPerSample() != bytesPerSample() || pcm->channels() != channels_)
+        return setError(
+            QvStatus::invalidArgument,
+            "Samples of %d channels and %d bytes do not fit the output of %d channels and %d bits",
+            pcm->channels(), pcm->bytesPerSample(), channels_, bitsPerSample_);
+    RawOutput output(*outStream());
+    if (headerDue_) {
+        headerDue_ = false;
+        if (muxer_ == "mxfmux")
+            if (const int result = putHeader(output)) return result;
+    }
+    if (samples == 0) return QvStatus::ok;
+    const auto bytes = static_cast<uint64_t>(samples) * static_cast<uint64_t>(bytesPerSample());
+    return putUnits(output, pcm->ptr(0), bytes);
+}
+
+// "LPCM", then the layout: bits 2 to 4 channels less one, bit 0 96 kHz, bits 5 and 6 the width.
+int RawAudioEnc::putHeader(RawOutput& output) {
+    int layout = (channels_ - 1) * 4;
+    if (samplerate_ == 96000) layout += 1;
+    if (bitsPerSample_ == 24) layout += 96;
+    if (bitsPerSample_ == 20) layout += 64;
+    const unsigned char header[6] = {'L', 'P', 'C', 'M', static_cast<unsigned char>(layout), 0};
+    return putUnit(output, header, sizeof header);
+}
+
+// These empty their ring at each announcement, so units that it can't hold at once go in pieces.
+bool RawAudioEnc::announcesUnits() const { return muxer_ == "rawmux" || muxer_ == "memmux"; }
+
+int RawAudioEnc::putUnits(RawOutput& output, const unsigned char* data, uint64_t bytes) {
+    const auto sample = static_cast<uint64_t>(bytesPerSample());
+    uint64_t unit = bytes;
+    if (announcesUnits() && output.largestBlock() >= sample)
+        unit = std::min<uint64_t>(bytes, output.largestBlock() / sample * sample);
+    for (; bytes > 0; data += unit, bytes -= unit) {
+        unit = std::min(unit, bytes);
+        if (const int result = putUnit(output, data, unit)) return result;
+        if (announcesUnits()) {
+            if (const int answer = output.announce(QvAuxId::AUDIO_AU_CODE, unit, announcedInfoBytes))
+                return setError(answer, "The output did not take the samples");
+            if (!output.sound()) return setError(QvStatus::failed, "%s", output.fault().c_str());
+        }
+    }
+    return QvStatus::ok;
+}
+
+int RawAudioEnc::putUnit(RawOutput& output, const unsigned char* data, uint64_t bytes) {
+    switch (output.put(data, bytes)) {
+        case RawPutResult::ok: return QvStatus::ok;
+        case RawPutResult::failed: return setError(QvStatus::failed, "%s", output.fault().c_str());
+        case RawPutResult::noBlock: break;
+    }
+    return setError(QvStatus::failed, "Error in raw audio encoder, can not allocte buffer, size=%d",
+                    static_cast<int>(output.asked()));
+}
+
+int RawAudioEnc::close() {
+    if (getState() != qvStateOpen) return QvStatus::ok;
+    setState(stateInitialised);
+    if (!(muxer_ == "rawmux")) return QvStatus::ok;
+    auto* out = outStream()->input();
+    out->auxinfo(out, 0, QvAuxId::STREAM_END_CODE, nullptr, 0);
+    if (outStream()->ioError() != 0)
+        return setError(QvStatus::failed, "%s", outStream()->ioErrorText().c_str());
+    return QvStatus::ok;
+}
+
+int RawAudioEnc::abort() {
+    if (getState() == qvStateOpen) setState(stateInitialised);
+    return QvStatus::ok;
+}
+
+QvCodec* newRawaenc() { return new RawAudioEnc; }

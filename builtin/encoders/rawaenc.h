@@ -1,0 +1,47 @@
+// RawAudioEnc: writes PCM as it is. Module "rawaenc".
+#pragma once
+
+#include <cstdint>
+
+#include "core/encode/qvencoder.h"
+#include "core/engine/qvmodule.h"
+
+// Samples go to the output as they lie in the buffer: interleaved, little-endian, (bits + 7) / 8 bytes a
+// value, 8 bits unsigned. With the multiplexers "rawmux" and "memmux" each writePcm is announced as an access
+// unit, in pieces of whole samples when the output can't hold it at once; with "rawmux" close marks the end
+// of the stream.
+class RawAudioEnc : public QvAudioEncoder {
+  public:
+    RawAudioEnc() = default;
+    ~RawAudioEnc() override;
+
+    int setParam(const char* name, const Any& value) override;
+    void getParam(const char* name, Any& value) const override;
+    using QvCodec::getParam;
+    void store(AnyDict& state) const override;
+    int restore(const AnyDict& state) override;
+
+    int attachOutStream(QvBufStream* stream) override;
+    int open() override;
+    int close() override;
+    int abort() override;
+    // QvStatus::invalidArgument when the buffer has another format than was set, or fewer samples.
+    int writePcm(QvPcm* pcm, int samples = -1) override;
+
+  private:
+    friend struct RawAudioParams;
+
+    int putHeader(class RawOutput& output);
+    bool announcesUnits() const;
+    int putUnits(RawOutput& output, const unsigned char* data, uint64_t bytes);
+    int putUnit(RawOutput& output, const unsigned char* data, uint64_t bytes);
+    int bytesPerSample() const { return channels_ * ((bitsPerSample_ + 7) / 8); }
+
+    int samplerate_ = 48000;
+    int channels_ = 2;
+    int bitsPerSample_ = 16;
+    int profile_ = -1;
+    int type_ = 0;
+    bool headerDue_ = false;
+    Any muxer_;  // name of the multiplexer, "N/A" when there is none
+};

@@ -1,0 +1,229 @@
+#include "builtin/encoders/rawvenc.h"
+
+#include <climits>
+#include <mutex>
+#include <system_error>
+
+#include "builtin/creators.h"
+#include "builtin/encoders/rawoutput.h"
+#include "builtin/encoders/rawvencformats.h"
+#include "core/engine/qvexception.h"
+#include "core/engine/qvlog.h"
+#include "core/engine/qvregistry.h"
+#include "core/filter/qvfilter.h"
+#include "core/stream/auxinfoid.h"
+#include "core/stream/qvbufstrm.h"
+#include "core/value/qvassert.h"
+
+namespace {
+
+constexpr int queuedFrames = 3;
+constexpr unsigned announcedInfoBytes = 32;
+
+}  // namespace
+
+RawVideoEnc::~RawVideoEnc() {
+    if (getState() == qvStateOpen) finish(true);
+}
+
+int RawVideoEnc::init() {
+    if (const int result = QvVideoEncoder::init()) return result;
+    return remake(720, 576, QvFourcc::BGR3);
+}
+
+unsigned RawVideoEnc::frameType() const { return type_ == QvFourcc::v210 ? QvFourcc::Y216 : type_; }
+
+// Leaves everything as it was when such a frame can't be made.
+int RawVideoEnc::remake(int width, int height, unsigned type) {
+    if (!qvPixelFormat(type)) return setError(QvStatus::invalidParam, "Unknown type 0x%08x", type);
+    const long long bytes = rawvenc::frameBytesBound(width, height);
+    if (width < 1 || height < 1 || bytes > INT_MAX / 2)
+        return setError(QvStatus::invalidParam, "Invalid frame size %dx%d", width, height);
+    if (picture_.init(type == QvFourcc::v210 ? QvFourcc::Y216 : type, width, height) != 0)
+        return setError(QvStatus::outOfMemory, "Out of memory for a frame of %dx%d", width, height);
+    width_ = width;
+    height_ = height;
+    type_ = type;
+    frameBytes_ = type == QvFourcc::v210 ? rawvenc::v210Bytes(width, height) : picture_.total_bytes();
+    havePicture_ = false;
+    return QvStatus::ok;
+}
+
+int RawVideoEnc::attachOutStream(QvBufStream* stream) {
+    QV_ASSERT_MSG(getState() != stateCreated, "not inited");
+    return QvVideoEncoder::attachOutStream(stream);
+}
+
+int RawVideoEnc::open() {
+    QV_ASSERT_MSG(getState() != stateCreated, "not initialized");
+    if (getState() != stateInitialised) return setError(QvStatus::failed, "Not initialized");
+    if (!outStream()) return setError(QvStatus::failed, "Output stream not attached");
+    failure_ = {};
+    if (accelerated_) {
+        if (const int result = queue_.init(queuedFrames)) return setError(result, "Out of memory");
+        stop_ = discard_ = false;
+        try {
+            worker_ = std::thread(&RawVideoEnc::work, this);
+        } catch (const std::system_error& error) {
+            queue_.destroy();
+            return setError(QvStatus::failed, "Can not start the writing thread: %s", error.what());
+        }
+    }
+    setState(qvStateOpen);
+    return QvStatus::ok;
+}
+
+bool RawVideoEnc::accepts(const QvFrame& frame) const {
+    return frame.planes() > 0 && frame.width(0) == width_ && frame.height(0) == height_ &&
+           qvEqualFourcc(frame.four_cc(), frameType());
+}
+
+// Without padding behind the rows, so that its memory is what goes out.
+bool RawVideoEnc::isPacked(const QvFrame& frame) const { return frame.total_bytes() == frameBytes_; }
+
+int RawVideoEnc::writeFrame(QvFrame* frame) {
+    if (getState() != qvStateOpen) return setError(QvStatus::illegalState, "Not opened");
+    if (!frame) return setError(QvStatus::invalidArgument, "No frame given");
+    if (!accepts(*frame))
+        return setError(QvStatus::invalidArgument, "A frame of %dx%d %s does not fit the output of %dx%d",
+                        frame->planes() > 0 ? frame->width(0) : 0, frame->planes() > 0 ? frame->height(0) : 0,
+                        frame->planes() > 0 ? frame->str_four_cc() : "no format", width_, height_);
+    if (getOut_) {
+        picture_ = *frame;
+        havePicture_ = true;
+    }
+    if (worker_.joinable()) return enqueue(*frame);
+    return report(writeOut(*frame));
+}
+
+QvFrame* RawVideoEnc::lastFrame() { return havePicture_ ? &picture_ : nullptr; }
+
+RawVideoEnc::Outcome RawVideoEnc::writeOut(const QvFrame& frame) {
+    if (type_ == QvFourcc::v210) {
+        const QvFrame* picture = nullptr;
+        if (auto outcome = convert(frame, picture); outcome.status != 0) return outcome;
+        return writePicture(*picture, frame.total_bytes());
+    }
+    if (isPacked(frame)) return writePicture(frame, frame.total_bytes());
+    picture_ = frame;
+    return writePicture(picture_, picture_.total_bytes());
+}
+
+// An output that takes access units apart needs the bytes that it was given; for others the announced count
+// is that of the frame that came in.
+RawVideoEnc::Outcome RawVideoEnc::writePicture(const QvFrame& picture, int announced) {
+    RawOutput output(*outStream());
+    const int bytes = picture.total_bytes();
+    switch (output.put(picture.plane(0, false), static_cast<uint64_t>(bytes))) {
+        case RawPutResult::ok: break;
+        case RawPutResult::noBlock: return {QvStatus::failed, true, output.asked()};
+        case RawPutResult::failed: return {QvStatus::failed, false, 0, output.fault()};
+    }
+    output.unlock();
+    const int answer =
+        output.announce(QvAuxId::VIDEO_AU_CODE, static_cast<uint64_t>(output.cutsUnits() ? bytes : announced),
+                        announcedInfoBytes);
+    if (answer != 0) return {answer, false, 0, "The output did not take the frame"};
+    if (!output.sound()) return {QvStatus::failed, false, 0, output.fault()};
+    return {};
+}
+
+// A block that an output without a known fault does not give is a broken contract.
+int RawVideoEnc::report(const Outcome& outcome) {
+    if (outcome.status == 0) return QvStatus::ok;
+    if (!outcome.noBlock) return setError(outcome.status, "%s", outcome.text.c_str());
+    const auto asked = static_cast<int>(outcome.asked);
+    setError(outcome.status, "Error in raw encoder, can not allocate buffer, size=%d", asked);
+    if (!worker_.joinable()) QV_FAIL(errorDesc());
+    return outcome.status;
+}
+
+RawVideoEnc::Outcome RawVideoEnc::convert(const QvFrame& frame, const QvFrame*& picture) {
+    if (!converter_)
+        if (auto outcome = openConverter(frame); outcome.status != 0) return outcome;
+    if (const int result = converter_->write(const_cast<QvFrame&>(frame)))
+        return {result, false, 0, "Can not convert the frame to v210"};
+    if (const int result = converter_->process())
+        return {result, false, 0, "Can not convert the frame to v210"};
+    picture = converter_->frame();
+    if (!picture || picture->four_cc() != QvFourcc::v210 || picture->total_bytes() != frameBytes_)
+        return {QvStatus::failed, false, 0, "Can not convert the frame to v210"};
+    return {};
+}
+
+RawVideoEnc::Outcome RawVideoEnc::openConverter(const QvFrame& frame) {
+    auto* codec = static_cast<QvVideoFilter*>(qv_registry()->newCodec("colorconv"));
+    if (!codec) return {QvStatus::failed, false, 0, "There is no colour converter for v210"};
+    std::unique_ptr<QvVideoFilter> made(codec);
+    made->setParam("outWidth", frame.width(0));
+    made->setParam("outHeight", frame.height(0));
+    made->setParam("FOURCC", static_cast<int>(QvFourcc::v210));
+    if (made->open() != 0) return {QvStatus::failed, false, 0, "Invalid input four cc given"};
+    converter_ = std::move(made);
+    return {};
+}
+
+int RawVideoEnc::enqueue(const QvFrame& frame) {
+    std::unique_lock lock(queue_);
+    slotFree_.wait(lock, [this] { return queue_.nrEmpty() > 0 || failure_.status != 0; });
+    if (failure_.status != 0) return report(failure_);
+    QvFrame* slot = queue_.emptyBuffer();  // stays at the head: the worker only appends
+    lock.unlock();
+    *slot = frame;
+    lock.lock();
+    queue_.moveToFull();
+    workReady_.notify_one();
+    return QvStatus::ok;
+}
+
+void RawVideoEnc::work() {
+    std::unique_lock lock(queue_);
+    while (failure_.status == 0) {
+        workReady_.wait(lock, [this] { return stop_ || queue_.nrFull() > 0; });
+        if (queue_.nrFull() == 0 || (stop_ && discard_)) break;
+        const QvFrame& frame = *queue_.fullBuffer();
+        lock.unlock();
+        auto outcome = writeQueued(frame);
+        lock.lock();
+        failure_ = std::move(outcome);
+        queue_.moveToEmpty();
+        slotFree_.notify_one();
+    }
+    slotFree_.notify_all();
+}
+
+RawVideoEnc::Outcome RawVideoEnc::writeQueued(const QvFrame& frame) noexcept {
+    try {
+        return writeOut(frame);
+    } catch (const QvException& failure) {
+        return {QvStatus::failed, false, 0, failure.what()};
+    } catch (const std::exception& failure) {
+        return {QvStatus::failed, false, 0, failure.what()};
+    }
+}
+
+int RawVideoEnc::close() { return getState() == qvStateOpen ? finish(false) : QvStatus::ok; }
+
+int RawVideoEnc::abort() { return getState() == qvStateOpen ? finish(true) : QvStatus::ok; }
+
+int RawVideoEnc::finish(bool discard) {
+    int result = QvStatus::ok;
+    if (worker_.joinable()) {
+        {
+            std::lock_guard lock(queue_);
+            stop_ = true;
+            discard_ = discard;
+            workReady_.notify_one();
+        }
+        worker_.join();
+        queue_.destroy();
+        result = report(failure_);
+    }
+    converter_.reset();
+    picture_.destroy();
+    havePicture_ = false;
+    setState(stateInitialised);
+    return result;
+}
+
+QvCodec* newRawvenc() { return new RawVideoEnc; }

@@ -1,0 +1,179 @@
+#include "builtin/muxers/rawmux.h"
+
+#include <algorithm>
+#include <cmath>
+#include <string>
+
+#include "builtin/creators.h"
+#include "builtin/encoders/rawoutput.h"
+#include "builtin/muxers/rawmuxoutput.h"
+#include "builtin/muxers/streamcodec.h"
+#include "builtin/sinks/qvfilebuiltins.h"
+#include "core/engine/qvfileutil.h"
+#include "core/media/fourcc.h"
+#include "core/stream/qvbufstreamsplit.h"
+#include "core/value/qvassert.h"
+
+namespace {
+
+constexpr char nameMissing[] = "[rawmux] Output filename not set";
+
+}  // namespace
+
+RawMux::RawMux() = default;
+
+RawMux::~RawMux() { finish(1); }
+
+int RawMux::attachOutStream(QvBufStream* stream) {
+    if (const int result = BaseMuxer::attachOutStream(stream)) return result;
+    stream->setParam(qvSinkDoNothing, 1);
+    return QvStatus::ok;
+}
+
+int RawMux::detachOutStream() {
+    if (outStream()) outStream()->setParam(qvSinkDoNothing, 0);
+    return BaseMuxer::detachOutStream();
+}
+
+QvBufStream* RawMux::addStream(int type, const AnyDict& params) {
+    std::unique_ptr<QvBufStream> made;
+    switch (type) {
+        case qvVideoStream: made = std::make_unique<QvBsSplitVideo>(this); break;
+        case qvAudioStream: made = std::make_unique<QvBsSplitAudio>(this); break;
+        case qvSubpicStream: made = std::make_unique<QvFileBufStream>(this); break;
+        default: QV_FAIL("Invalid stream type");
+    }
+    made->setParamDict(params);
+    return keep(type, std::move(made));
+}
+
+bool RawMux::hasSeveral() const { return nrStreams(qvVideoStream) > 1 || nrStreams(qvAudioStream) > 1; }
+
+Any RawMux::outputName(int type, int nr) const {
+    QV_ASSERT_MSG(filename_.isText(), nameMissing);
+    auto& output = *stream(type, nr);
+    Any name = QvFile::stripExt(filename_);
+    if (hasSeveral()) name = Any::strcat(name, Any::sprintf("#%02d", nr));
+    return Any::strcat(Any::strcat(name, "."), qvStreamExtension(output, ""));
+}
+
+// Streams whose names agree would write over each other.
+int RawMux::checkNames() const {
+    AnyVector names;
+    for (const int type : {qvVideoStream, qvAudioStream})
+        for (int nr = 0; nr < nrStreams(type); ++nr) {
+            if (!stream(type, nr)->enabled()) continue;
+            const auto name = outputName(type, nr);
+            if (names.contains(name)) return -1;
+            names.append(name);
+        }
+    return 0;
+}
+
+int RawMux::open() {
+    QV_ASSERT_MSG(getState() == stateInitialised, "[rawmux] Invalid state");
+    QV_ASSERT_MSG(filename_.isText(), nameMissing);
+    QV_ASSERT_MSG(anyEnabled(), "No enabled streams - use QvTranscoder::link()");
+    QV_ASSERT_MSG(outStream(), "Output not set");
+    outputs_.clear();
+    if (checkNames() != 0)
+        return setError(QvStatus::failed,
+                        "Two streams would be written to one file, their extensions are equal");
+    if (const int result = openAll()) {
+        const std::string text = errorDesc();
+        finish(1);
+        return setError(result, "%s", text.c_str());
+    }
+    setState(qvStateOpen);
+    return QvStatus::ok;
+}
+
+int RawMux::openAll() {
+    for (int nr = 0; nr < nrStreams(qvAudioStream); ++nr)
+        if (stream(qvAudioStream, nr)->enabled())
+            if (const int result = openAudio(nr)) return result;
+    for (int nr = 0; nr < nrStreams(qvVideoStream); ++nr)
+        if (stream(qvVideoStream, nr)->enabled())
+            if (const int result = openVideo(nr)) return result;
+    return QvStatus::ok;
+}
+
+int RawMux::openAudio(int nr) {
+    auto& output = *stream(qvAudioStream, nr);
+    const auto* encoder = output.atachee();
+    const bool pcm = qvIsCodec(encoder, "rawaenc");
+    output.setParam("isPcm", pcm ? 1 : 0);
+    output.setParam("split", pcm && splitAudio_ ? 1 : 0);
+    if (pcm)
+        for (const char* name : {"samplerate", "channels", "bitsPerSample"})
+            output.setParam(name, encoder->getParam(name));
+    output.setParam(rawWriteThrough, pcm ? 0 : 1);
+    const int channels = encoder ? qvIntParam(*encoder, "channels", 1) : 1;
+    outputs_.push_back(std::make_unique<Output>(output, outputName(qvAudioStream, nr),
+                                                pcm && splitAudio_ ? Output::channelFiles : Output::oneFile,
+                                                channels));
+    return openStream(qvAudioStream, nr, "Unable to open output audio file %s");
+}
+
+int RawMux::openVideo(int nr) {
+    auto& output = *stream(qvVideoStream, nr);
+    const auto* encoder = output.atachee();
+    const bool raw = qvIsCodec(encoder, "rawvenc");
+    const bool split = splitVideo_ && (raw || qvIsCodec(encoder, "mj2kvenc"));
+    const bool png = split && rawAsPng_ && raw;
+    const int digits = totalFrames_ >= 1
+                           ? static_cast<int>(std::ceil(std::log10(static_cast<double>(totalFrames_))) + 0.1)
+                           : 0;
+    output.setParam("split", split ? 1 : 0);
+    output.setParam("nrDigits", digits);
+    const auto size = output.getParam("size");
+    if (split && size.isInt32() && size.asInt32() > 0) output.setParam("chunk", size);
+    output.setParam("png", png ? 1 : 0);
+    if (png) {
+        output.setParam("width", encoder->getParam("width"));
+        output.setParam("height", encoder->getParam("height"));
+        output.setParam("FOURCC", encoder->getParam("selectedFOURCC"));
+    }
+    output.setParam(rawWriteThrough, split ? 0 : 1);
+    outputs_.push_back(std::make_unique<Output>(output, outputName(qvVideoStream, nr),
+                                                split ? Output::pictureFiles : Output::oneFile, digits, png));
+    return openStream(qvVideoStream, nr, "Unable to open output video file %s");
+}
+
+int RawMux::openStream(int type, int nr, const char* failure) {
+    auto& output = *stream(type, nr);
+    const auto name = outputName(type, nr);
+    output.setParam("outfilename", name);
+    if (output.init() == 0) return QvStatus::ok;
+    outputs_.back()->failed = true;
+    const std::string message = failure;
+    return setError(QvStatus::failed, "%s%s", message.substr(0, message.size() - 2).c_str(),
+                    qv_os_name(name).c_str());
+}
+
+int RawMux::close() { return getState() == qvStateOpen ? finish(0) : QvStatus::ok; }
+
+int RawMux::abort() { return getState() == qvStateOpen ? finish(1) : QvStatus::ok; }
+
+// Every file is finished, whatever happens to one of them; the first failure is told.
+int RawMux::finish(int abort) {
+    std::string failure;
+    for (const int type : {qvAudioStream, qvVideoStream})
+        for (int nr = 0; nr < nrStreams(type); ++nr) {
+            auto& output = *stream(type, nr);
+            if (!output.inited()) continue;
+            output.destroy(abort);
+            if (failure.empty() && output.ioError() != 0) failure = output.ioErrorText();
+        }
+    for (auto& output : outputs_) output->release();
+    if (getState() == qvStateOpen) setState(stateInitialised);
+    return failure.empty() || abort ? QvStatus::ok : setError(QvStatus::failed, "%s", failure.c_str());
+}
+
+AnyVector RawMux::filesWritten() const {
+    AnyVector files;
+    for (const auto& output : outputs_) output->appendFiles(files);
+    return files;
+}
+
+QvCodec* newRawmux() { return new RawMux; }

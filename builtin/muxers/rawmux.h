@@ -1,0 +1,63 @@
+// RawMux: gives each stream a file of its own, an elementary stream export. Module "rawmux".
+#pragma once
+
+#include <memory>
+#include <vector>
+
+#include "core/encode/basemuxer.h"
+
+// Names: the output's name without its extension, "#00" and so on (the number within the type) when there are
+// several streams of any type, and the extension of the encoder. "a.mpg" with one video and two audio streams
+// gives a#00.raw, a#00.wav and a#01.wav.
+//
+// Parameters:
+//   "filename"       text    the name that the others are made from
+//   "splitVideo"     bool    one file for each picture of a raw encoder: a#0.raw, a#1.raw ...
+//   "splitAudio"     bool    one WAV file for each channel of a raw encoder: a#00.wav, a#01.wav ...
+//   "rawAsPng"       bool    with splitVideo, PNG pictures
+//   "_totalFrames"   int     pictures to come; gives their numbers a common width
+//   "filenames"      vector  read only: the names of all streams, enabled or not
+//   "filesWritten"   vector  read only: every file that the last run made, pictures and channels one by one.
+//                            After close with status 0 they are complete; otherwise they are what is left.
+class RawMux : public BaseMuxer {
+  public:
+    RawMux();
+    ~RawMux() override;
+
+    int setParam(const char* name, const Any& value) override;
+    void getParam(const char* name, Any& value) const override;
+    using QvCodec::getParam;
+    void store(AnyDict& state) const override;
+    int restore(const AnyDict& state) override;
+
+    // The sink has nothing to write; it is told so.
+    int attachOutStream(QvBufStream* stream) override;
+    int detachOutStream() override;
+    QvBufStream* addStream(int type, const AnyDict& params) override;
+    // Opens the files of all enabled streams. When one fails, all are closed again.
+    int open() override;
+    // Result and text tell when a file could not be written to its end.
+    int close() override;
+    int abort() override;
+
+  private:
+    friend struct RawMuxParams;
+    struct Output;
+
+    bool hasSeveral() const;
+    Any outputName(int type, int nr) const;
+    int checkNames() const;
+    int openAll();
+    int openAudio(int nr);
+    int openVideo(int nr);
+    int openStream(int type, int nr, const char* failure);
+    int finish(int abort);
+    AnyVector filesWritten() const;
+
+    Any filename_;
+    int totalFrames_ = 0;
+    bool splitVideo_ = false;
+    bool splitAudio_ = false;
+    bool rawAsPng_ = false;
+    std::vector<std::unique_ptr<Output>> outputs_;  // of the last run
+};

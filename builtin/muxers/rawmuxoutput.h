@@ -1,0 +1,42 @@
+// The files that one stream of the elementary stream export makes.
+#pragma once
+
+#include "builtin/muxers/rawmux.h"
+#include "core/stream/auxinfoid.h"
+#include "core/stream/qvbufstrm.h"
+
+// Counts the pictures of a stream that makes a file of each, by listening to their announcements.
+struct RawMux::Output final : QvAuxInfoObserver {
+    enum Kind { oneFile, pictureFiles, channelFiles };
+
+    // `count`: digits of the picture numbers, or channels. `stream` must live until release().
+    Output(QvBufStream& output, const Any& fullName, Kind filesAre, int countIs, bool isPng = false)
+        : name(fullName), kind(filesAre), count(countIs), png(isPng), stream(&output) {
+        if (kind == pictureFiles) stream->registerObserver(this);
+    }
+    ~Output() override { release(); }
+    Output(const Output&) = delete;
+    Output& operator=(const Output&) = delete;
+
+    void release() {
+        if (stream && kind == pictureFiles) stream->unregisterObserver(this);
+        stream = nullptr;
+    }
+    void auxInfo(unsigned, unsigned id, void*, unsigned) override {
+        if (id == QvAuxId::VIDEO_AU_CODE) ++pictures;
+    }
+    // Those that are there.
+    void appendFiles(AnyVector& files) const;
+
+    Any name;
+    Kind kind;
+    int count;
+    bool png;
+    bool failed = false;  // could not be opened
+    int pictures = 0;
+
+  private:
+    Any numbered(int digitCount, int number, const Any& extension) const;
+
+    QvBufStream* stream;
+};

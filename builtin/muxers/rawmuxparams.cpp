@@ -1,0 +1,83 @@
+// Parameters of the elementary stream export.
+#include "builtin/muxers/rawmux.h"
+#include "builtin/muxers/streamcodec.h"
+#include "core/engine/params.h"
+#include "core/engine/qvregistry.h"
+#include "core/media/qvgeometry.h"
+#include "core/preset/qvpresetmgr.h"
+#include "core/value/qvassert.h"
+
+struct RawMuxParams {
+    using Mux = RawMux;
+    using Access = QvParamAccess<Mux>;
+
+    static double estimateSecKb(const Mux& mux) {
+        double sum = 0;
+        for (const int type : {qvVideoStream, qvAudioStream})
+            for (int nr = 0; nr < mux.nrStreams(type); ++nr)
+                if (const auto* encoder = mux.stream(type, nr)->atachee()) {
+                    const Any part = encoder->getParam("estimateSecKb");
+                    if (part.isInt() || part.isFloat()) sum += part.toDouble();
+                }
+        return sum;
+    }
+    static Any extension(const Mux& mux) {
+        if (mux.nrStreams(qvVideoStream) > 0) return qvStreamExtension(*mux.stream(qvVideoStream, 0), "vid");
+        if (mux.nrStreams(qvAudioStream) > 0) return "aud";
+        return "vid";
+    }
+    static Any filenames(const Mux& mux) {
+        AnyVector names;
+        for (const int type : {qvVideoStream, qvAudioStream})
+            for (int nr = 0; nr < mux.nrStreams(type); ++nr) names.append(mux.outputName(type, nr));
+        return names;
+    }
+    static AnyVector codecs(const Mux& mux, int kind) {
+        const auto* presets = qv_registry()->presetMgr();
+        return presets ? presets->getCompatible(mux.name(), kind) : AnyVector();
+    }
+
+    static std::span<const QvParamRow<Mux>> rows() {
+        using M = const Mux&;
+        static const QvParamRow<Mux> table[] = {
+            {"rawAsPng", &Mux::rawAsPng_, qvParamStored},
+            {"splitVideo", &Mux::splitVideo_, qvParamStored},
+            {"splitAudio", &Mux::splitAudio_, qvParamStored},
+            {"filename", &Mux::filename_},
+            {"type", {}, qvParamIgnored},
+            {"_totalFrames", &Mux::totalFrames_},
+            {"rawMux", Access{nullptr, [](M, Any& v) { v = 1; }}},
+            {"estimateSecKb", Access{nullptr, [](M m, Any& v) { v = estimateSecKb(m); }}},
+            {"videoCodecs", Access{nullptr, [](M m, Any& v) { v = codecs(m, 7); }}},
+            {"audioCodecs", Access{nullptr, [](M m, Any& v) { v = codecs(m, 6); }}},
+            {"extension", Access{nullptr, [](M m, Any& v) { v = extension(m); }}},
+            {"filenames", Access{nullptr, [](M m, Any& v) { v = filenames(m); }}},
+            {"filesWritten", Access{nullptr, [](M m, Any& v) { v = m.filesWritten(); }}},
+            {"maxStreams",
+             Access{nullptr, [](M, Any& v) { v = AnyDict("vids", 99, "auds", 99, "subs", 0, "total", 99); }}},
+        };
+        return table;
+    }
+};
+
+int RawMux::setParam(const char* name, const Any& value) {
+    QV_ASSERT_MSG(getState() != qvStateOpen, "[RawMux] Invalid state");
+    _traceParam(name, value);
+    if (auto result = qvSetParamRow(RawMuxParams::rows(), *this, name, value)) return *result;
+    return BaseMuxer::setParam(name, value);
+}
+
+void RawMux::getParam(const char* name, Any& value) const {
+    if (!qvGetParamRow(RawMuxParams::rows(), *this, name, value)) BaseMuxer::getParam(name, value);
+}
+
+void RawMux::store(AnyDict& state) const {
+    state.clear();
+    state.set("name", name());
+    qvStoreParamRows(RawMuxParams::rows(), *this, state);
+}
+
+int RawMux::restore(const AnyDict& state) {
+    if (!(state.get("name") == name())) return setError(QvStatus::failed, "restore - invalid name");
+    return qvRestoreParamRows(RawMuxParams::rows(), *this, state);
+}

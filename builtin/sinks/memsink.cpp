@@ -1,0 +1,44 @@
+#include "builtin/sinks/memsink.h"
+
+#include "builtin/creators.h"
+#include "core/engine/params.h"
+#include "core/media/qvgeometry.h"
+
+MemSink::~MemSink() { stream_.destroy(1); }
+
+// A file sink can be exchanged for this one, so its parameters are taken.
+int MemSink::setParam(const char* name, const Any& value) {
+    static constexpr QvParamRow<MemSink> rows[] = {
+        {"filename", {}, qvParamIgnored},
+        {"bufsize", {}, qvParamIgnored},
+    };
+    _traceParam(name, value);
+    if (auto result = qvSetParamRow<MemSink>(rows, *this, name, value)) return *result;
+    return QvSink::setParam(name, value);
+}
+
+int MemSink::open() {
+    if (getState() == stateCreated || running_)
+        return setError(QvStatus::illegalState, "%s: illegal state", "open");
+    stream_.setOutputQueue(&queue_);
+    if (const int result = stream_.init()) return setError(result, "Failed to init bufstream object");
+    running_ = true;
+    setState(qvStateOpen);
+    return QvStatus::ok;
+}
+
+int MemSink::close() {
+    if (!running_) return QvStatus::ok;
+    stream_.destroy(0);
+    running_ = false;
+    return QvStatus::ok;
+}
+
+QvBufStream* MemSink::stream() const { return &stream_; }
+
+void* MemSink::getInterface(int kind) const {
+    if (kind == qvOutputQueueInterface) return static_cast<QvAuQueuePoll*>(&queue_);
+    return QvSink::getInterface(kind);
+}
+
+QvCodec* newMemsink() { return new MemSink; }

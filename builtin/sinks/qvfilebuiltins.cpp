@@ -1,0 +1,159 @@
+#include "builtin/sinks/qvfilebuiltins.h"
+
+#include <mutex>
+
+#include "builtin/creators.h"
+#include "core/engine/params.h"
+#include "core/engine/qvfileutil.h"
+#include "core/engine/qvlog.h"
+#include "core/media/qvgeometry.h"
+#include "core/value/qvassert.h"
+
+struct FileSinkParams {
+    static constexpr int largestBuffer = 1 << 30;
+
+    static std::span<const QvParamRow<FileSink>> rows() {
+        static const QvParamRow<FileSink> table[] = {
+            {"filename", &FileSink::filename_},
+            {"bufsize", &FileSink::bufsize_, qvParamPlain, 1, largestBuffer},
+            {"filesWritten", QvParamAccess<FileSink>{nullptr, filesWritten}},
+        };
+        return table;
+    }
+
+    static void filesWritten(const FileSink& sink, Any& value) {
+        AnyVector files;
+        if (sink.written_.isText()) files.append(sink.written_);
+        value = files;
+    }
+};
+
+namespace {
+
+// For messages only.
+std::string shown(const Any& name) {
+    const Any text = name.toString();
+    return text.isString() ? text.asString() : "(no name)";
+}
+
+}  // namespace
+
+FileSink::~FileSink() {
+    if (getState() == qvStateOpen) finish(1);
+}
+
+int FileSink::init() { return QvSink::init(); }
+
+int FileSink::setParam(const char* name, const Any& value) {
+    _traceParam(name, value);
+    if (getState() == stateCreated) return setError(QvStatus::failed, "not inited");
+    if (auto result = qvSetParamRow(FileSinkParams::rows(), *this, name, value)) return *result;
+    return QvSink::setParam(name, value);
+}
+
+void FileSink::getParam(const char* name, Any& value) const {
+    if (!qvGetParamRow(FileSinkParams::rows(), *this, name, value)) QvSink::getParam(name, value);
+}
+
+int FileSink::open() {
+    QV_ASSERT_MSG(getState() != stateCreated, "not inited");
+    if (getState() == qvStateOpen)
+        if (const int result = close()) return result;
+    written_.invalidate();
+    const auto& nothing = stream_.getParam(qvSinkDoNothing);
+    doNothing_ = nothing.isInt32() && nothing.asInt32() != 0;
+    if (!doNothing_) {
+        if (!filename_.isText() || filename_.isFalse())
+            return setError(QvStatus::failed, "Failed to open output file: no name is set");
+        stream_.setParam("size", bufsize_);
+        stream_.setParam("outfilename", filename_);
+        if (stream_.init() != 0) {
+            qv_dbg()->error("Can not create file %s", shown(filename_).c_str());
+            return setError(QvStatus::failed, "Failed to open output file");
+        }
+        written_ = filename_;
+    }
+    setState(qvStateOpen);
+    return QvStatus::ok;
+}
+
+// Asking for the whole buffer makes the file's record write what it holds.
+int FileSink::writeOut() {
+    std::lock_guard lock(stream_);
+    auto* out = stream_.input();
+    const auto size = static_cast<unsigned>(bufsize_);
+    if (out->usable(out) < size && !out->request(out, size)) return QvStatus::failed;
+    return stream_.ioError() == 0 ? QvStatus::ok : QvStatus::failed;
+}
+
+int FileSink::failFlush() {
+    qv_dbg()->error("FileSink, Error, can not flush %s", shown(filename_).c_str());
+    const auto reason = stream_.ioErrorText();
+    return setError(QvStatus::failed, "%s",
+                    reason.empty() ? "Can not write to the output file" : reason.c_str());
+}
+
+void FileSink::finish(int abort) {
+    if (!doNothing_) stream_.destroy(abort);
+    setState(stateInitialised);
+}
+
+int FileSink::close() {
+    QV_ASSERT_MSG(getState() != stateCreated, "not inited");
+    if (getState() != qvStateOpen) return QvStatus::ok;
+    const int result = doNothing_ ? QvStatus::ok : writeOut();
+    finish(0);
+    if (result != QvStatus::ok || (!doNothing_ && stream_.ioError() != 0)) return failFlush();
+    return QvStatus::ok;
+}
+
+int FileSink::flush() {
+    if (getState() != qvStateOpen || doNothing_ || !stream_.inited()) return QvStatus::ok;
+    return writeOut() == QvStatus::ok ? QvStatus::ok : failFlush();
+}
+
+int FileSink::abort() {
+    QV_ASSERT_MSG(getState() != stateCreated, "not inited");
+    if (getState() == qvStateOpen) finish(1);
+    return QvStatus::ok;
+}
+
+QvBufStream* FileSink::stream() const {
+    if (getState() != stateCreated) return &stream_;
+    const_cast<FileSink*>(this)->setError(QvStatus::failed, "Not inited");
+    return nullptr;
+}
+
+NullSink::~NullSink() { stream_.destroy(1); }
+
+// A file sink can be exchanged for this one, so its parameters are taken.
+int NullSink::setParam(const char* name, const Any& value) {
+    static constexpr QvParamRow<NullSink> rows[] = {
+        {"filename", {}, qvParamIgnored},
+        {"bufsize", {}, qvParamIgnored},
+    };
+    _traceParam(name, value);
+    if (auto result = qvSetParamRow<NullSink>(rows, *this, name, value)) return *result;
+    return QvSink::setParam(name, value);
+}
+
+int NullSink::open() {
+    QV_ASSERT_MSG(getState() != stateCreated, "not inited");
+    stream_.setParam("size", bufsize_);
+    if (stream_.init() != 0) return setError(QvStatus::failed, "Failed to init bufstream object");
+    setState(qvStateOpen);
+    return QvStatus::ok;
+}
+
+int NullSink::close() {
+    if (getState() != qvStateOpen) return QvStatus::ok;
+    stream_.destroy(0);
+    setState(stateInitialised);
+    return QvStatus::ok;
+}
+
+QvBufStream* NullSink::stream() const { return &stream_; }
+
+QvCodec* newFilesink() { return new FileSink; }
+
+QvCodec* newNullsink() { return new NullSink; }

@@ -1,0 +1,60 @@
+// FileSink and NullSink: the ends of an output on a file and nowhere. Modules "filesink", "nullsink".
+#pragma once
+
+#include "core/encode/qvsink.h"
+#include "core/engine/qvmodule.h"
+#include "core/stream/qvfilebufstream.h"
+
+constexpr int qvSinkBufferSize = 0x800000;  // bytes, at first
+
+// A multiplexer that writes files of its own sets this parameter of the sink's stream to 1, so that no empty
+// file appears.
+constexpr char qvSinkDoNothing[] = "doNothing";
+
+// Parameters: "filename" (text) and "bufsize" (bytes, Int32). What could not be written is a status and a
+// text of flush or close; the file is then left incomplete under its name. "filesWritten" answers the
+// vector of that name when the last open made the file.
+class FileSink : public QvSink {
+  public:
+    FileSink() = default;
+    ~FileSink() override;
+
+    int init() override;
+    int setParam(const char* name, const Any& value) override;
+    void getParam(const char* name, Any& value) const override;
+    using QvCodec::getParam;
+    int open() override;
+    int close() override;
+    int flush() override;
+    int abort() override;
+    QvBufStream* stream() const override;
+
+  private:
+    friend struct FileSinkParams;
+
+    int writeOut();
+    int failFlush();
+    void finish(int abort);
+
+    mutable QvFileBufStream stream_{this};
+    Any filename_;
+    int bufsize_ = qvSinkBufferSize;
+    bool doNothing_ = false;
+    Any written_;  // name of the file made by the last open, invalid for none
+};
+
+// Swallows everything.
+class NullSink : public QvSink {
+  public:
+    NullSink() = default;
+    ~NullSink() override;
+
+    int setParam(const char* name, const Any& value) override;
+    int open() override;
+    int close() override;
+    QvBufStream* stream() const override;
+
+  private:
+    mutable QvNullBufStream stream_{this};
+    int bufsize_ = qvSinkBufferSize;
+};

@@ -1,0 +1,179 @@
+#include "core/encode/qvencodepipe.h"
+
+#include <optional>
+#include <string>
+
+#include "core/engine/qvlog.h"
+#include "core/engine/qvregistry.h"
+#include "core/filter/filtersstate.h"
+#include "core/media/qvgeometry.h"
+#include "core/stream/qvbufmem.h"
+#include "core/stream/qvbufstrm.h"
+#include "core/value/qvassert.h"
+
+namespace {
+
+struct Limits {
+    QvAVS3plet<int> streams;
+    int total = 0;
+
+    int of(int type) const {
+        switch (type) {
+            case 0: return total;
+            case qvVideoStream: return streams.video;
+            case qvAudioStream: return streams.audio;
+            case qvSubpicStream: return streams.subpic;
+            default: QV_FAIL("EncodePipe.maxStreams: invalid stream type");
+        }
+    }
+};
+
+// `complaint` takes the multiplexer's name; it is logged before the assertion.
+Limits limitsOf(QvMuxer* muxer, const char* complaint) {
+    QV_ASSERT_MSG(muxer, "EncodePipe: muxer is null.");
+    Any answer;
+    muxer->getParam("maxStreams", answer);
+    if (!answer.isDict()) {
+        qv_dbg()->error(complaint, muxer->name());
+        QV_FAIL_PLAIN();
+    }
+    const auto& dict = answer.asDict();
+    return {{dict.getInt32("vids", 0), dict.getInt32("auds", 0), dict.getInt32("subs", 0)},
+            dict.getInt32("total", 0)};
+}
+
+const char* channelsText(int channels) {
+    return channels == 1 ? "mono" : channels == 2 ? "stereo" : "multi ch.";
+}
+
+std::optional<int> intParam(const QvCodec& codec, const char* name) {
+    Any value;
+    codec.getParam(name, value);
+    if (!value.isInt()) return std::nullopt;
+    return value.toInt32();
+}
+
+void describeBitrate(const QvEncoder& encoder, AnyVector& out) {
+    Any rate;
+    encoder.getParam("bitrate", rate);
+    if (rate.isBitrate()) out.append(rate.asBitrate().desc());
+}
+
+void describeVideo(const QvEncoder& encoder, AnyVector& out) {
+    const auto width = intParam(encoder, "width");
+    const auto height = intParam(encoder, "height");
+    if (width && height) out.append(Any::sprintf("%dx%d", *width, *height));
+    Any rate;
+    encoder.getParam("framerate", rate);
+    if (rate.isFramerate()) out.append(rate.asFramerate().desc(false, false));
+}
+
+void describeAudio(const QvEncoder& encoder, AnyVector& out) {
+    if (const auto rate = intParam(encoder, "samplerate")) out.append(Any::sprintf("%dHz", *rate));
+    if (const auto channels = intParam(encoder, "channels")) out.append(Any(channelsText(*channels)));
+}
+
+}  // namespace
+
+QvOStream::QvOStream(int streamType) : type(streamType), filters_(std::make_unique<FiltersState>()) {}
+
+QvOStream::~QvOStream() = default;
+
+bool QvOStream::enabled() const { return bitstream && bitstream->enabled(); }
+
+void QvOStream::setEnabled(bool on) {
+    if (bitstream) bitstream->setEnabled(on);
+}
+
+QvEncodePipe* QvEncodePipe::create() {
+    return static_cast<QvEncodePipe*>(qv_registry()->newCodec("encpipe"));
+}
+
+int QvEncodePipe::flush() {
+    int result = 0;
+    if (auto* muxer = getMuxer()) result |= muxer->flush();
+    if (auto* end = sink()) result |= end->flush();
+    return result;
+}
+
+int QvEncodePipe::addSubpicStream(const Any& params) { return addStream(qvSubpicStream, params); }
+
+int QvEncodePipe::canAddStreams(int type) const {
+    const auto limits =
+        limitsOf(getMuxer(), "EncodePipe.canAddStreams: muxer '%s' returned invalid value for 'maxStreams'");
+    const int left = limits.total - nrStreams(qvAllStreams);
+    if (type == 0) return left;
+    const int limit = limits.of(type);
+    if (limit == 0) return -1;
+    if (left <= 0) return 0;
+    return limit - nrStreams(type);
+}
+
+int QvEncodePipe::maxStreams(QvAVS3plet<int>* limits) const {
+    const auto all =
+        limitsOf(getMuxer(), "EncodePipe.maxStreams: muxer '%s' does not implement 'maxStreams' parameter");
+    if (limits) *limits = all.streams;
+    return all.total;
+}
+
+int QvEncodePipe::maxStreams(int type) const {
+    return limitsOf(getMuxer(), "EncodePipe.maxStreams: muxer '%s' does not implement 'maxStreams' parameter")
+        .of(type);
+}
+
+bool QvEncodePipe::programsSupported() const {
+    const auto* muxer = getMuxer();
+    if (!muxer) return false;
+    Any answer;
+    muxer->getParam("programsSupported", answer);
+    return answer.isTrue();
+}
+
+QvIProgramSetup* QvEncodePipe::programSetup() const {
+    if (const auto* muxer = getMuxer())
+        return static_cast<QvIProgramSetup*>(muxer->getInterface(qvProgramSetupInterface));
+    qv_dbg()->error("EncodePipe.programSetup: muxer is null.");
+    return nullptr;
+}
+
+int QvEncodePipe::setFilename(const Any& name) { return setParam("filename", name); }
+
+Any QvEncodePipe::getFilename() { return getParam("filename"); }
+
+void QvEncodePipe::setFilters(QvOStream* stream, const FiltersState& filters) {
+    QV_ASSERT_MSG(stream, "Invalid stream");
+    stream->filters() = filters;
+}
+
+const FiltersState& QvEncodePipe::filters(QvOStream* stream) const {
+    QV_ASSERT_MSG(stream, "Invalid stream");
+    return stream->filters();
+}
+
+QvAuQueuePoll* QvEncodePipe::outputQueue() const {
+    if (const auto* end = sink())
+        return static_cast<QvAuQueuePoll*>(end->getInterface(qvOutputQueueInterface));
+    qv_dbg()->error("EncodePipe.outputQueue: sink is null.");
+    return nullptr;
+}
+
+void* QvEncodePipe::getInterface(int kind) const {
+    return kind == 3 ? const_cast<QvEncodePipe*>(this) : nullptr;
+}
+
+void QvEncodePipe::setFilters(int type, int nr, const FiltersState& filters) {
+    setFilters(stream(type, nr), filters);
+}
+
+const FiltersState& QvEncodePipe::filters(int type, int nr) const { return filters(stream(type, nr)); }
+
+void QvEncodePipe::getStreamDesc(int type, int nr, AnyVector& out) const {
+    out.clear();
+    const auto* found = stream(type, nr);
+    if (!found || !found->encoder) return;
+    if (type == qvVideoStream)
+        describeVideo(*found->encoder, out);
+    else
+        describeAudio(*found->encoder, out);
+    describeBitrate(*found->encoder, out);
+}
