@@ -47,8 +47,9 @@ class QV_API QvPlatform {
     // the C library; a substitute that wants these to fail returns a stream of its own making.
     virtual std::FILE* openFile(const char* name, const char* mode);
     // A file descriptor of the C runtime for libraries that take nothing else, or -1. Writing creates or
-    // truncates. The caller closes it through the library.
+    // truncates. The library that takes it closes it; closeDescriptor is for one that was not taken.
     virtual int openDescriptor(const char* name, bool writing);
+    virtual void closeDescriptor(int descriptor);
     // Positions of 64 bits; `origin` is SEEK_SET, SEEK_CUR or SEEK_END. tell gives -1 on failure.
     virtual int seek(std::FILE* file, long long offset, int origin);
     virtual long long tell(std::FILE* file);
