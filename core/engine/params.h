@@ -3,28 +3,36 @@
 // A codec keeps typed members and one constexpr table; the table serves setParam, getParam, store,
 // restore and the parameter descriptions. An Any is checked and converted once, here at the door.
 //
-//     struct Fade { double start = 0; int frames = 25; bool invert = false; };
-//     constexpr QvParamRow<Fade> rows[] = {
-//         {"start",  &Fade::start},
-//         {"frames", &Fade::frames, qvParamStored, 1, 1000},
-//         {"invert", &Fade::invert},
+//     struct Settings { double start = 0; int frames = 25; bool invert = false; };
+//     constexpr QvParamRow<Settings> rows[] = {
+//         {"start", &Settings::start},
+//         {"frames", &Settings::frames, qvParamStored, 1, 1000, "length of the fade"},
+//         {"invert", &Settings::invert},
 //     };
-//     int setParam(const char* name, const Any& value) {
-//         if (auto result = qvSetParamRow<Fade>(rows, fade, name, value)) return *result;
+//     static_assert(qvParamTableOk<Settings>(rows));
+//
+//     int Fade::setParam(const char* name, const Any& value) {
+//         if (auto result = _setRow<Settings>(rows, settings_, name, value)) return *result;
 //         return QvVideoFilter::setParam(name, value);
+//     }
+//     void Fade::getParam(const char* name, Any& value) const {
+//         if (!qvGetParamRow<Settings>(rows, settings_, name, value)) QvVideoFilter::getParam(name, value);
 //     }
 //
 // What a row can't say (side effects, indexed names as "channel3_volume") is written by hand beside it.
 #pragma once
 
+#include <climits>
 #include <cstring>
 #include <limits>
 #include <optional>
 #include <span>
 #include <string>
+#include <string_view>
 #include <type_traits>
 #include <variant>
 
+#include "core/engine/qvcodec.h"
 #include "core/engine/status.h"
 #include "core/value/any.h"
 #include "core/value/anycontainer.h"
@@ -70,15 +78,17 @@ struct QvParamRow {
 namespace qvparam {
 
 // Conversions of the door. Each returns false, and leaves `to` alone, if `from` can't be such a value.
+// Numbers are Int32, Int64 and Float; an integer takes a Float without its fraction, and what does not fit,
+// or is no number (NaN), is refused. Text never becomes a number.
 QV_API bool convert(const Any& from, int& to);
 QV_API bool convert(const Any& from, unsigned& to);
-QV_API bool convert(const Any& from, bool& to);
+QV_API bool convert(const Any& from, bool& to);  // any number, true unless 0
 QV_API bool convert(const Any& from, double& to);
 QV_API bool convert(const Any& from, long long& to);
 QV_API bool convert(const Any& from, std::string& to);  // String as it is, WString as UTF-8, invalid as empty
 QV_API bool convert(const Any& from, AnyDict& to);
 QV_API bool convert(const Any& from, AnyVector& to);
-QV_API bool convert(const Any& from, QvFramerate& to);  // also a Float or integer: frames a second
+QV_API bool convert(const Any& from, QvFramerate& to);  // also a number above 0: frames a second
 QV_API bool convert(const Any& from, QvRect& to);
 QV_API bool convert(const Any& from, QvPoint& to);
 QV_API bool convert(const Any& from, Pair& to);
@@ -94,7 +104,7 @@ void deliver(const V& from, Any& to) {
     if constexpr (std::is_same_v<V, bool>)
         to = from ? 1 : 0;
     else if constexpr (std::is_same_v<V, unsigned>)
-        to = static_cast<int>(from);
+        from <= INT_MAX ? to.set(static_cast<int>(from)) : to.set(static_cast<long long>(from));
     else if constexpr (std::is_same_v<V, std::string>)
         to = Any(from.c_str());
     else
@@ -108,6 +118,62 @@ bool inRange(const V& value, double min, double max) {
     else
         return true;
 }
+
+// What a row holds, for people.
+enum class Kind {
+    integer,
+    natural,
+    number,
+    flag,
+    text,
+    dictionary,
+    list,
+    framerate,
+    rectangle,
+    point,
+    pair,
+    time,
+    bitrate,
+    any,
+    special
+};
+
+template <class V>
+constexpr Kind kindOf() {
+    if constexpr (std::is_same_v<V, int> || std::is_same_v<V, long long>) return Kind::integer;
+    if constexpr (std::is_same_v<V, unsigned>) return Kind::natural;
+    if constexpr (std::is_same_v<V, double>) return Kind::number;
+    if constexpr (std::is_same_v<V, bool>) return Kind::flag;
+    if constexpr (std::is_same_v<V, std::string>) return Kind::text;
+    if constexpr (std::is_same_v<V, AnyDict>) return Kind::dictionary;
+    if constexpr (std::is_same_v<V, AnyVector>) return Kind::list;
+    if constexpr (std::is_same_v<V, QvFramerate>) return Kind::framerate;
+    if constexpr (std::is_same_v<V, QvRect>) return Kind::rectangle;
+    if constexpr (std::is_same_v<V, QvPoint>) return Kind::point;
+    if constexpr (std::is_same_v<V, Pair>) return Kind::pair;
+    if constexpr (std::is_same_v<V, MediaTime>) return Kind::time;
+    if constexpr (std::is_same_v<V, QvBitrate>) return Kind::bitrate;
+    if constexpr (std::is_same_v<V, Any>) return Kind::any;
+    return Kind::special;
+}
+
+template <class T>
+Kind kindOfRow(const QvParamRow<T>& row) {
+    auto kind = []<class V>(V T::*) { return kindOf<V>(); };
+    return std::visit(
+        [&](auto member) {
+            if constexpr (std::is_member_pointer_v<decltype(member)>)
+                return kind(member);
+            else
+                return Kind::special;
+        },
+        row.member);
+}
+
+// "'frames' takes an integer from 1 to 1000, not 5000".
+QV_API std::string refusal(const char* name, Kind kind, double min, double max, const Any& value);
+// Adds "type", "min" and "max" as far as the kind has them; a "special" row has the type of its value.
+QV_API void describe(Kind kind, double min, double max, const Any& value, AnyDict& row);
 
 template <class T, class V>
 int assign(T& object, V T::*member, const QvParamRow<T>& row, const Any& value) {
@@ -190,5 +256,56 @@ int qvRestoreParamRows(std::span<const QvParamRow<T>> rows, T& object, const Any
         const auto status = qvSetParamRow(rows, object, row.name, dict.get(row.name));
         if (status && *status != QvStatus::ok && result == QvStatus::ok) result = *status;
     }
+    return result;
+}
+
+// For a static_assert below each table: every name is there once and short enough for a dictionary, and no
+// range is empty.
+template <class T>
+constexpr bool qvParamTableOk(std::span<const QvParamRow<T>> rows) {
+    for (std::size_t i = 0; i < rows.size(); ++i) {
+        if (!rows[i].name || !*rows[i].name || !(rows[i].min <= rows[i].max)) return false;
+        const std::string_view name = rows[i].name;
+        if (name.size() > static_cast<std::size_t>(AnyDict::maxKeyLength)) return false;
+        for (std::size_t k = 0; k < i; ++k)
+            if (name == rows[k].name) return false;
+    }
+    return true;
+}
+
+// Why a row refuses a value, for a user; "" if there is no such row.
+template <class T>
+std::string qvParamRefusal(std::span<const QvParamRow<T>> rows, const char* name, const Any& value) {
+    const auto* row = qvFindParamRow(rows, name);
+    return row ? qvparam::refusal(row->name, qvparam::kindOfRow(*row), row->min, row->max, value) : "";
+}
+
+// One Dict for each row that takes or gives a value: "name", "type" (as Any::typeName), "min" and "max"
+// (Float, where there is a range), "default" (what `defaults` holds), "description" (if the row has one),
+// "readOnly" or "writeOnly" (1).
+template <class T>
+AnyVector qvDescribeParamRows(std::span<const QvParamRow<T>> rows, const T& defaults) {
+    AnyVector all;
+    for (const auto& row : rows) {
+        if (row.flags & qvParamIgnored) continue;
+        AnyDict described("name", row.name);
+        Any value;
+        if (qvGetParamRow(rows, defaults, row.name, value)) described.set("default", value);
+        qvparam::describe(qvparam::kindOfRow(row), row.min, row.max, value, described);
+        if (*row.description) described.set("description", row.description);
+        if (row.flags & qvParamReadOnly) described.set("readOnly", 1);
+        if (row.flags & qvParamWriteOnly) described.set("writeOnly", 1);
+        all.append(described);
+    }
+    return all;
+}
+
+template <class T>
+std::optional<int> QvCodec::_setRow(std::span<const QvParamRow<T>> rows, T& object, const char* name,
+                                    const Any& value) {
+    const std::optional<int> result = qvSetParamRow(rows, object, name, value);
+    if (!result) return result;
+    _traceParam(name, value);
+    if (*result == QvStatus::invalidParam) setError(*result, "%s", qvParamRefusal(rows, name, value).c_str());
     return result;
 }

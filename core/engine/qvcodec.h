@@ -2,12 +2,16 @@
 #pragma once
 
 #include <cstdarg>
+#include <optional>
+#include <span>
 
 #include "core/arch/api.h"
 #include "core/value/any.h"
 #include "core/value/anycontainer.h"
 
 class QvModule;
+template <class T>
+struct QvParamRow;
 
 // A codec is set up by name and value, reports failures as a status with a text that stays in it, and can
 // write its configuration to a dictionary and read it back. It belongs to the thread that drives it.
@@ -81,6 +85,12 @@ class QV_API QvCodec {
     // First act of every setParam: logs name and value, unless the codec is still in state 1 or the debug
     // option "log_setparam" is off.
     void _traceParam(const char* name, const Any& value) const;
+    // For parameters that are rows over typed fields ("core/engine/params.h", which defines it): traces the
+    // call and sets the row's field. nullopt: no row takes this name. A refused value leaves its field alone
+    // and is an error with a text.
+    template <class T>
+    std::optional<int> _setRow(std::span<const QvParamRow<T>> rows, T& object, const char* name,
+                               const Any& value);
 
   private:
     friend class QvModule;

@@ -1,0 +1,66 @@
+#include <gtest/gtest.h>
+
+#include <cstdint>
+#include <string>
+#include <vector>
+
+#include "core/engine/qvutil.h"
+#include "core/media/qvgeometry.h"
+#include "tests/support/log_capture.h"
+
+namespace {
+
+TEST(ParamTrace, EveryTypeHasItsForm) {
+    const struct {
+        Any value;
+        const char* line;
+    } cases[] = {
+        {Any(), "v [Invalid]     = n/a"},
+        {Any(-7), "v [Int32]       = -7"},
+        {Any(1.5), "v [Float]       = 1.500000"},
+        {Any(1LL << 40), "v [Int64]       = 1099511627776"},
+        {Any("text %s"), "v [String]      text %s"},
+        {Any(u"wide \u00E9"), "v [WString]     wide \u00E9"},
+        {Any(reinterpret_cast<const void*>(std::uintptr_t{0xAB12})), "v [Generic]     = 0x000000000000AB12"},
+        {Any(QvPoint(1, -2)), "v [Point]       = (1, -2)"},
+        {Any(Pair(3, 4)), "v [Pair]        = (3, 4)"},
+        {Any(QvRect(1, 2, 3, 4)), "v [Rect]        = (value)"},
+        {Any(MediaTime(1500LL, 1000)), "v [MediaTime]   = 1.500000s"},
+    };
+    LogCapture log;
+    for (const auto& c : cases) {
+        log.clear();
+        QvUtil::debugOutAny("v", c.value, 0, 16);
+        EXPECT_EQ(log.texts(), std::vector<std::string>{c.line});
+        EXPECT_EQ(log.lines()[0].mask, QvLogMask::debug);
+    }
+    log.clear();
+    const QvFramerate rate(25.0);
+    const QvBitrate bits(QvBitrate::cbr, 1000000);
+    QvUtil::debugOutAny("r", rate, 0, 0);
+    QvUtil::debugOutAny("b", bits, 0, 0);
+    EXPECT_EQ(log.texts(),
+              (std::vector<std::string>{std::string("r [Framerate] = ") + rate.desc(true, true).asString(),
+                                        std::string("b [Bitrate] = ") + bits.desc().asString()}));
+}
+
+TEST(ParamTrace, ContainersFollowOneLevelDeeper) {
+    const AnyDict inner("x", 1, "y", AnyVector(Any("a"), Any(2)));
+    LogCapture log;
+    QvUtil::debugOutAny("top", inner, 1, 20);
+    EXPECT_EQ(log.texts(), (std::vector<std::string>{
+                               "  top [Dict] ",
+                               "    x [Int32]       = 1",
+                               "    y [Vector] ",
+                               "      0 [String]    a",
+                               "      1 [Int32]     = 2",
+                           }));
+    log.clear();
+    QvUtil::debugOutAny("top", inner, 0, 20, false);
+    EXPECT_EQ(log.texts(), std::vector<std::string>{"top [Dict] "});
+    log.clear();
+    QvUtil::debugOutDict(AnyDict("k", 1.0));
+    EXPECT_EQ(log.texts(), std::vector<std::string>{"k [Float]                               = 1.000000"});
+}
+
+}  // namespace

@@ -1,0 +1,71 @@
+// What plug-in code with a plain C interface gets by name.
+#include <gtest/gtest.h>
+
+#include <cstring>
+
+#include "core/engine/qvcodec.h"
+#include "core/engine/qvlog.h"
+
+namespace {
+
+template <class F>
+F* service(const char* name) {
+    return reinterpret_cast<F*>(QvCodec::get_rc(name));
+}
+template <class F>
+F* serviceEx(const char* name) {
+    return reinterpret_cast<F*>(QvCodec::get_rc_ex(nullptr, name));
+}
+
+TEST(Services, OnlyKnownNames) {
+    for (const char* name :
+         {"nonsense", "", "err_printf_ex", "prg_printf_ex", static_cast<const char*>(nullptr)})
+        EXPECT_EQ(QvCodec::get_rc(name), nullptr);
+    for (const char* name : {"malloc", "free", "yield", "nonsense", static_cast<const char*>(nullptr)})
+        EXPECT_EQ(QvCodec::get_rc_ex(nullptr, name), nullptr);
+}
+
+TEST(Services, MemoryAndConstants) {
+    auto* allocate = service<void*(unsigned)>("malloc");
+    auto* release = service<void(void*)>("free");
+    ASSERT_TRUE(allocate && release);
+    void* block = allocate(100000);
+    std::memset(block, 1, 100000);
+    release(block);
+    void* empty = allocate(0);
+    EXPECT_NE(empty, nullptr);
+    release(empty);
+    release(nullptr);
+    EXPECT_EQ(service<int()>("yield")(), 0);
+    EXPECT_EQ(service<int()>("prompt_index_mode")(), 1);
+    EXPECT_EQ(serviceEx<int(void*)>("prompt_index_mode")(nullptr), 1);
+}
+
+TEST(Services, MessagesReachTheUsersList) {
+    const struct {
+        const char* name;
+        int mask;
+    } cases[] = {{"err_printf", 2}, {"wrn_printf", 4}, {"inf_printf", 8}, {"prg_printf", 0}};
+    for (const auto& c : cases) {
+        qv_log()->clear();
+        service<void(const char*, ...)>(c.name)("%s %d", "plain", 1);
+        serviceEx<void(void*, const char*, ...)>(c.name)(qv_log(), "%s %d", "context", 2);
+        serviceEx<void(void*, const char*, ...)>((std::string(c.name) + "_ex").c_str())(nullptr, "%s %d",
+                                                                                        "ex", 3);
+        AnyVector all;
+        qv_log()->getAll(all);
+        ASSERT_EQ(all.size(), c.mask ? 3 : 0) << c.name;
+        const char* texts[] = {"plain 1", "context 2", "ex 3"};
+        for (int i = 0; i < all.size(); ++i) {
+            EXPECT_STREQ(all.at(i).asDict().getString("text"), texts[i]);
+            EXPECT_EQ(all.at(i).asDict().getInt32("type"), c.mask);
+        }
+    }
+    service<void(const char*, ...)>("inf_printf")("%s", std::string(1500, 'x').c_str());
+    AnyVector all;
+    qv_log()->getAll(all);
+    EXPECT_EQ(std::strlen(all.back().asDict().getString("text")), 1023u);
+    qv_log()->clear();
+}
+
+}  // namespace
