@@ -35,9 +35,8 @@ inline bool isTiny(std::string_view number) {
     const std::string_view digits = number.substr(0, mark);
     const std::size_t point = std::min(digits.find('.'), digits.size());
     const std::size_t first = digits.find_first_of("123456789");
-    const long long exponent =
-        mark == number.size() ? 0 : parseInteger<long long>(number.substr(mark + 1)) / 2;
-    return static_cast<long long>(point) - static_cast<long long>(first) + 2 * exponent <= 0;
+    const long long exponent = mark == number.size() ? 0 : parseInteger<int>(number.substr(mark + 1));
+    return static_cast<long long>(point) - static_cast<long long>(first) + exponent <= 0;
 }
 
 }  // namespace qvnumber
