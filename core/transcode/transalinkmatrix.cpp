@@ -91,8 +91,7 @@ void TransALink::logMatrix() const {
         for (const Any& source : sourcesOf(connMatrix_.at(i))) {
             const Source from = sourceOf(source);
             if (!line.empty()) line += " + ";
-            line +=
-                "[stream:" + std::to_string(from.stream) + ", channel:" + std::to_string(from.channel) + "]";
+            line += Any::sprintf("[stream:%d, channel:%d]", from.stream, from.channel).asString();
         }
         qv_dbg()->debug("%i <- %s", i, line.empty() ? "MUTE" : line.c_str());
     }
