@@ -16,5 +16,3 @@ QvCodec* newRawaenc();
 QvCodec* newNullmux();
 QvCodec* newMemmux();
 QvCodec* newMemsink();
-QvCodec* newVprocess();
-QvCodec* newAprocess();
