@@ -16,3 +16,5 @@ QvCodec* newRawaenc();
 QvCodec* newNullmux();
 QvCodec* newMemmux();
 QvCodec* newMemsink();
+QvCodec* newVprocess();
+QvCodec* newAprocess();

@@ -61,7 +61,7 @@ class QV_API QvProcessUtil {
     // stream; empty when no stream has a delay.
     static void calculateSRAudioDelayCorrections(QvMuxer* muxer, AnyDict& dict);
 
-    // Description of a parameter of type Any::INT32, FLOAT, STRING or WSTRING. Without a `min` of that type
+    // Description of a parameter of type Any::Int32, Float, String or WString. Without a `min` of that type
     // there is no range.
     static AnyDict createParamDesc(const char* name, int type, int guiControl, const char* description,
                                    const Any& min = Any(), const Any& max = Any(), const Any& step = Any());

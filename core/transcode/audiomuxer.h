@@ -27,9 +27,6 @@ class QV_API AudioMuxer {
     void store(AnyVector& matrix) const { matrix = matrix_; }
 
   private:
-    void connectDefault();
-    void connectStraight(int count);
-
     int decStream_ = -1;
     int inChannels_ = 0;
     int outChannels_ = 0;

@@ -14,5 +14,27 @@ class QV_API QvEncodingQualityStatsSetup : public AnyVector {
     QvEncodingQualityStatsSetup() = default;
     QvEncodingQualityStatsSetup(const AnyVector& logs) : AnyVector(logs) {}
 
-    void addLog(const Any& filename);
+    void addLog(const Any& filename) { append(AnyDict("filename", filename)); }
+};
+
+// Collects what an encoder reports of its frames on its bitstream, and writes it as text: one line a frame,
+// with the frame's number, its size in bytes, and the values of its statistics (doubles, for PSNR in dB) in
+// the order in which the encoder gives them.
+class QV_API QvPSNRLogger {
+  public:
+    QvPSNRLogger();
+    QvPSNRLogger(const QvPSNRLogger&) = delete;
+    QvPSNRLogger& operator=(const QvPSNRLogger&) = delete;
+    ~QvPSNRLogger();
+
+    // Listens to `stream` (borrowed, to stopLogging at the latest). -1 without a stream, or one that can't be
+    // listened to.
+    int startLogging(QvBufStream* stream, const QvEncodingQualityStatsSetup& setup);
+    // Writes every log of the setup; -1, with an error in the log, if one of them can't be written.
+    int writeLog() const;
+    void stopLogging();
+
+  private:
+    struct Private;
+    std::unique_ptr<Private> p_;
 };

@@ -6,15 +6,18 @@
 // has finished, close. One thread at a time. Decoder and encoder pipe are not owned and must outlive it.
 #pragma once
 
+#include <initializer_list>
 #include <memory>
 #include <vector>
 
 #include "core/arch/api.h"
+#include "core/filter/jobdescription.h"
 #include "core/media/qvbuffer.h"
 #include "core/transcode/processparams.h"
 #include "core/value/any.h"
 
 class QvAProcessPipe;
+class QvAudioEncoder;
 class QvCodec;
 class QvDecodePipe;
 class QvEncodePipe;
@@ -79,13 +82,13 @@ class QV_API TransLink {
     Any _encPar(const char* name) const;  // "video0/NAME": a parameter of this stream on the encoder pipe
     int setError(int code, const Any& text);
     void copyError(int code, const Any& text);
-    void resetState();
-    void takeStreams(QvDecodePipe* decoder, int decStream, QvEncodePipe* encoder, int encStream);
     void nameStreams();
     void readLogProgress();
-    // The points of `params`, or those of the whole stream of `count` units at a rate; true if they were
-    // given.
+    // The points of `params`, or 0 to `end`, where also an out point of 0 lies; true if they were given.
     bool takePoints(const AnyDict* params, const MediaTime& end);
+    // The description of encoder and filters that ends the log of a link.
+    void logEncoder(const QvCodec& encoder, std::initializer_list<const char*> names) const;
+    static void logFilter(int number, const QvCodec& filter);
 
     QvDecodePipe* decoder_ = nullptr;
     QvEncodePipe* encoder_ = nullptr;
@@ -140,39 +143,42 @@ class QV_API TransVLink : public TransLink {
   private:
     struct Step;
 
+    int views(const Any& value) const;
     unsigned chooseFOURCC(unsigned inFOURCC) const;
-    void takeFrameRange(const AnyDict* params, const AnyDict& stream, const QvFramerate& inRate);
-    bool applyChapters(const AnyDict* params, const QvFramerate& inRate);
-    void buildPipe(const AnyDict* params, const AnyDict& stream, const QvFramerate& inRate);
-    void setTotalVDuration();
-    void setupSmartRender(const AnyDict* params, const AnyDict& stream, bool chapters);
-    bool pipeAllowsSmartRender(const AnyDict& stream) const;
+    int takeFrameRange(const AnyDict* params, const AnyDict& stream);
+    bool applyChapters(const AnyDict* params);
+    void describeJob(const AnyDict* params, const AnyDict& stream);
+    void _setTotalVDuration();
+    bool pipeAllowsSmartRender() const;
+    void setupSmartRender(bool wanted);
     void setupLogger(const AnyDict* params);
     void writeLog();
+    void releasePipe();
 
-    void readStep(Step& step);
-    void pipeStep(Step& step);
     void smartStep(Step& step);
+    void pipeStep(Step& step);
+    void directStep(Step& step);
     void writeStep(Step& step);
     void endStep(Step& step);
     void repeatLast(Step& step);
     int _processOneFrame();
     void feedMetaSources(QvFrame* frame);
-    void makeIcon(const QvFrame* frame) const;
+    void makeIcon(QvFrame* frame) const;
+    int writeFrame(QvFrame* frame);
 
     QvEncodingQualityStatsSetup qualitySetup_;
     std::unique_ptr<QvPSNRLogger> psnrLogger_;
     QvFramerate outFramerate_;
-    std::unique_ptr<QvVProcessPipe> videoPipe_;
-    int nrFramesIn_ = 0;     // frames to read, from in to out point
-    int nrFramesOut_ = 0;    // frames that the encoder is to get
-    int framesWritten_ = 0;  // -1 after close
-    int startFrame_ = 0;     // at the input rate
-    int stopFrame_ = 0;      // inclusive
+    std::unique_ptr<QvVProcessPipe> videoPipe_;  // null when no processing is needed
+    int nrFramesIn_ = 0;                         // frames to read, from in to out point
+    int nrFramesOut_ = 0;                        // frames that the encoder is to get
+    int framesWritten_ = 0;                      // -1 after close
+    int startFrame_ = 0;                         // at the input rate
+    int stopFrame_ = 0;                          // inclusive
     int decViews_ = 1;
     int encViews_ = 1;
     std::vector<std::unique_ptr<MetaVHelper>> metaSources_;
-    int needTopBlanking_ = 0;
+    VideoJobDescription job_;  // of the pipe, which may keep a pointer to it
 };
 
 class QV_API TransALink : public TransLink {
@@ -211,24 +217,27 @@ class QV_API TransALink : public TransLink {
     QvPcm* _muxStreams();
 
   private:
-    struct Step;
+    struct Source;
 
-    void readFormat(const AnyDict& stream);
-    long long sampleCount(const AnyDict& stream) const;
+    int readFormat(const AnyDict& stream);
     bool _verifyConnMatrix() const;
-    bool checkSource(const Any& source, int channel, int index) const;
-    void defaultMatrix();
-    void buildPipe(const AnyDict* params, const AnyDict& stream, MediaTime& delay);
-    void shiftPoints(const MediaTime& delay, long long samples);
+    bool verifySource(const Any& source, int channel, int index) const;
+    void logMatrix() const;
+    void takeMatrix(const AnyDict* params);
+    void buildPipe(const AnyDict* params, MediaTime& delay);
+    void shiftPoints(const MediaTime& delay, const MediaTime& end);
     void computeRange();
     void setupSmartRender(const AnyDict* params);
+    Source sourceOf(const Any& source) const;
+    QvAudioEncoder* audioEncoder() const;
 
     int smartStep(int n);
-    int directStep(int n, int& written);
-    int pipeStep(int n, int& written);
-    int noSamples();
-    void endStep();
-    void logDone(const char* text) const;
+    int directStep(int n);
+    int pipeStep(int n);
+    int endStep(int result);
+    int readFailed();
+    void logDone(const char* what) const;
+    bool prepareSilence(int n);
 
     long long totalInSamples_ = 0;
     long long totalOutSamples_ = 0;
@@ -248,6 +257,9 @@ class QV_API TransALink : public TransLink {
     bool silenceLogged_ = false;
     std::unique_ptr<QvAProcessPipe> audioPipe_;
     bool smartRendering_ = false;
-    long long inStart_ = 0;
+    int inBits_ = 0;
+    int outBits_ = 0;
+    int inChannels_ = 0;
+    long long inStart_ = 0;  // samples of the input, from in to out point
     long long inEnd_ = 0;
 };

@@ -191,9 +191,8 @@ class QV_API Any {
     bool isInt() const { return type_ == Int32 || type_ == Int64; }
 
     // Unchecked reads: the payload as asked for, whatever the type says. A number read under another type is
-    // its bits. Where that can't be, because the payload is no such object: a text read is null, a
-    // container read is the container's null sentinel, an object read is an assertion. (A Generic may point
-    // to any of them.)
+    // its bits. Where the payload is no such object: a text read is null, a container read is the container's
+    // null sentinel, an object read is an assertion. (A Generic may point to any of them.)
     int asInt32() const { return static_cast<int>(static_cast<std::uint32_t>(bits_)); }
     long long asInt64() const { return static_cast<long long>(bits_); }
     double asFloat() const { return std::bit_cast<double>(bits_); }
@@ -202,7 +201,7 @@ class QV_API Any {
     unsigned short* asWString() const {
         return isWString() || isGeneric() ? static_cast<unsigned short*>(pointer()) : nullptr;
     }
-    void* asGeneric() const { return pointer(); }
+    void* asGeneric() const { return reinterpret_cast<void*>(static_cast<std::uintptr_t>(bits_)); }
     AnyDict& asDict();
     const AnyDict& asDict() const;
     AnyVector& asVector();
@@ -220,7 +219,7 @@ class QV_API Any {
     operator float() const { return static_cast<float>(asFloat()); }
     operator char*() const { return asString(); }
     operator unsigned short*() const { return asWString(); }
-    operator void*() const { return pointer(); }
+    operator void*() const { return asGeneric(); }
     operator AnyDict&() { return asDict(); }
     operator const AnyDict&() const { return asDict(); }
     operator AnyVector&() { return asVector(); }
@@ -253,7 +252,8 @@ class QV_API Any {
     double toDouble() const;
     double toFloat() const { return toDouble(); }
 
-    // Text as UTF-8 or as UTF-16; invalid for a value that is no text.
+    // Text as UTF-8 or as UTF-16; invalid for a value that is no text. What is no valid text survives the way
+    // there and back, as core/arch/widename.h tells, so that file names of any bytes keep their meaning.
     Any toString() const;
     Any toWString() const;
     // Characters from `start` up to but not including `end`. Negative positions count from the end, -1 as
@@ -300,10 +300,7 @@ class QV_API Any {
         1u << (Invalid + 1) | 1u << (Int32 + 1) | 1u << (Float + 1) | 1u << (Int64 + 1);
     bool isPlain() const { return (plainTypes >> (type_ + 1)) & 1u; }
     bool ownsStorage() const { return !isPlain(); }
-    void* pointer() const {
-        return reinterpret_cast<void*>(static_cast<std::uintptr_t>(isPlain() ? 0 : bits_));
-    }
-    void setPointer(const void* p) { bits_ = reinterpret_cast<std::uintptr_t>(p); }
+    void* pointer() const { return isPlain() ? nullptr : asGeneric(); }
 
     void takePlain(const Any& other) noexcept {
         bits_ = other.bits_;
@@ -320,21 +317,20 @@ class QV_API Any {
     void refuseNull() const {
         if (isNull()) failNull();
     }
+    // The payload is, or may be, an object of this type.
+    bool holds(int type) const { return type_ == type || (type_ == Generic && pointer()); }
     void release() noexcept;  // frees what is held; the fields are stale afterwards
-    void replaceBy(Any&& fresh) noexcept;
+    void adopt(const void* storage, int size, int type) noexcept;
     void copyStorage(const Any& other);
     void takeStorage(Any& other) noexcept;
     void assign(const Any& other);
     void assign(Any&& other);
-    void remeasure() noexcept;
     template <class Unit>
     void setText(const Unit* text, int length, int type);
-    template <class T>
+    template <class Stored, class T>
     void setObject(T&& value, int type);
     template <class T>
     T& object(int type) const;
-
-    friend class PtrListImp;
 };
 
 // False for any type but String (WString in the wide form): a WString never equals a narrow literal.

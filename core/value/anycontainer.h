@@ -129,8 +129,9 @@ class QV_API AnyVector {
     Impl* impl_ = nullptr;  // made with the first element
 
     Impl& writable();  // an assertion on the null sentinel
-    Any& place(Any* fresh);
     Any* const* elements() const;
+
+    friend struct AnyPath;  // the walk of descendant
 };
 
 // Keys of at most 40 characters, in an order of their own: by signed bytes, a shorter key before its

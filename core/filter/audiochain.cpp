@@ -1,0 +1,125 @@
+// The automatic audio chain. Between its first and last stage samples are 32 bits wide.
+#include <algorithm>
+#include <utility>
+
+#include "core/engine/qvutil.h"
+#include "core/filter/chainfilters.h"
+#include "core/filter/jobdescription.h"
+#include "core/filter/qvprocesspipe.h"
+#include "core/filter/qvprocessutil.h"
+#include "core/media/qvgeometry.h"
+#include "core/value/qvassert.h"
+
+namespace {
+
+constexpr int workBits = 32;
+constexpr int silentChannel = -1;
+constexpr double maxDelayMs = 1e9;  // far beyond any stream, and well inside a MediaTime
+
+using AudioFilterPtr = std::unique_ptr<QvAudioFilter>;
+
+void appendChannel(AnyVector& channels, const Any& source) {
+    if (source.isDict() && source.asDict().get("channel").isInt32())
+        channels.append(source.asDict().get("channel"));
+}
+
+// One entry an output channel: -1 for silence, or the vector of the input channels that are mixed.
+AnyVector normaliseMatrix(const AnyVector& matrix) {
+    AnyVector normal;
+    for (int i = 0; i < matrix.size(); ++i) {
+        const Any& entry = matrix.at(i);
+        AnyVector channels;
+        if (entry.isVector()) {
+            for (int j = 0; j < entry.asVector().size(); ++j) appendChannel(channels, entry.asVector().at(j));
+        } else {
+            appendChannel(channels, entry);
+        }
+        if (!entry)
+            normal.append(Any(silentChannel));
+        else if (entry.isVector() || entry.isDict())
+            normal.append(Any(channels));
+        else
+            normal.append(entry);
+    }
+    return normal;
+}
+
+bool namesOwnIndex(const Any& entry, int index) {
+    if (entry.isInt32()) return entry.asInt32() == index;
+    if (!entry.isVector() || entry.asVector().size() != 1) return false;
+    return entry.asVector().at(0) == Any(index);
+}
+
+bool isIdentity(const AnyVector& matrix) {
+    for (int i = 0; i < matrix.size(); ++i)
+        if (!namesOwnIndex(matrix.at(i), i)) return false;
+    return true;
+}
+
+AudioFilterPtr newRateConverter(const AudioJobDescription& job) {
+    if (job.inSamplerate == job.outSamplerate) return nullptr;
+    auto converter = qvchain::requireAudioFilter("srconvert");
+    converter->setParam("inSamplerate", job.inSamplerate);
+    converter->setParam("outSamplerate", job.outSamplerate);
+    return converter;
+}
+
+AudioFilterPtr newChannelConverter(const AudioJobDescription& job) {
+    const AnyVector matrix = normaliseMatrix(job.connMatrix);
+    if (job.inChannels == job.outChannels && isIdentity(matrix)) return nullptr;
+    auto converter = qvchain::requireAudioFilter("chconvert");
+    converter->setParam("connMatrix", Any(matrix));
+    return converter;
+}
+
+AudioFilterPtr newQuantizer(int bits) {
+    auto quantizer = qvchain::requireAudioFilter("aquant");
+    quantizer->setParam("outBitsPerSample", bits);
+    return quantizer;
+}
+
+// A delay that is not positive is no filter: the link skips that much input instead.
+void takeOutDelays(qvchain::AudioFilters& filters, MediaTime& startOffset) {
+    std::erase_if(filters, [&](const AudioFilterPtr& filter) {
+        if (Any(filter->name()) != "adelay") return false;
+        const Any delay = filter->getParam("delay");
+        const double ms =
+            delay.isInt() || delay.isFloat() ? std::clamp(delay.toDouble(), -maxDelayMs, maxDelayMs) : 0.0;
+        if (ms > 0) return false;
+        startOffset = MediaTime(-ms / 1000.0, MediaTime::defaultTimescale);
+        return true;
+    });
+}
+
+void append(QvAProcessPipe& pipe, AudioFilterPtr filter) {
+    if (filter) pipe.addFilter(filter.release(), -1);
+}
+
+}  // namespace
+
+QvAProcessPipe* QvProcessUtil::createAudioPipe(const AudioJobDescription& job, MediaTime& delayOut) {
+    AnyVector frontStates;
+    AnyVector backStates;
+    QvUtil::getSortedEffects(job.filters, frontStates, backStates, true);
+    auto front = qvchain::restoreAudioFilters(frontStates);
+    auto back = qvchain::restoreAudioFilters(backStates);
+    takeOutDelays(front, delayOut);
+    takeOutDelays(back, delayOut);
+
+    auto rate = newRateConverter(job);
+    auto channels = newChannelConverter(job);
+    if (!rate && !channels && job.inBitsPerSample == job.outBitsPerSample && front.empty() && back.empty())
+        return nullptr;
+
+    std::unique_ptr<QvAProcessPipe> pipe(QvAProcessPipe::create());
+    QV_ASSERT_MSG(pipe, "module 'aprocess' is not available");
+    if (job.inBitsPerSample != workBits) append(*pipe, newQuantizer(workBits));
+    for (auto& filter : front) append(*pipe, std::move(filter));
+    // The rate converter costs most, so it runs on the side with fewer channels.
+    if (job.outChannels > job.inChannels) append(*pipe, std::move(rate));
+    append(*pipe, std::move(channels));
+    append(*pipe, std::move(rate));
+    for (auto& filter : back) append(*pipe, std::move(filter));
+    append(*pipe, newQuantizer(job.outBitsPerSample));
+    return pipe.release();
+}

@@ -1,0 +1,55 @@
+// Which converters change a frame rate, and whether they may run before the scaler.
+#include "core/filter/chainfilters.h"
+#include "core/media/qvgeometry.h"
+#include "core/media/qvratio.h"
+
+namespace {
+
+std::unique_ptr<QvVideoFilter> newStage(const QvFramerate& in, const QvFramerate& out) {
+    auto converter = qvchain::requireConverter("frconvert", "framerate converter");
+    converter->setParam("inFramerate", in);
+    converter->setParam("outFramerate", out);
+    return converter;
+}
+
+// Two progressive frames weave into one interlaced frame, so their rate has to be the field rate.
+qvchain::RateStages weave(const QvFramerate& in, const QvFramerate& out) {
+    const QvFramerate fieldRate(QvRatio(out.rate().num * 2, out.rate().den));
+    qvchain::RateStages stages;
+    stages.behindScaler = true;
+    if (!QvNum::equ(in.rate(), fieldRate.rate(), QvRatio::tolerance)) stages.pre = newStage(in, fieldRate);
+    stages.main = newStage(fieldRate, out);
+    stages.main->setParam("pulldown", 0);
+    stages.main->setParam("interlace", out.interlaced() == 1 ? 1 : 2);
+    return stages;
+}
+
+// 3:2 pulldown needs rates at exactly 4 to 5: film and NTSC meet at a rate between.
+qvchain::RateStages pulldown(const QvFramerate& in, const QvFramerate& out) {
+    qvchain::RateStages stages;
+    stages.behindScaler = true;
+    QvFramerate coded = in;
+    if (in.is23p() && out.is60i()) coded = QvFramerate::f24p();
+    if (in.is24p() && out.is59i()) coded = QvFramerate::f23p();
+    if (!QvNum::equ(in.rate(), coded.rate(), QvRatio::tolerance)) stages.pre = newStage(in, coded);
+    stages.main = newStage(coded, out);
+    stages.main->setParam("pulldown", 1);
+    return stages;
+}
+
+}  // namespace
+
+namespace qvchain {
+
+RateStages chooseRateStages(const QvFramerate& in, const QvFramerate& out) {
+    constexpr double slack = 1e-8;
+    const bool weaves = out.interlaced() != 0 && in.interlaced() == 0 &&
+                        in.rate().ratio() >= 2.0 * out.rate().ratio() - slack;
+    if (weaves) return weave(in, out);
+    if ((in.is23p() || in.is24p()) && (out.is59i() || out.is60i())) return pulldown(in, out);
+    RateStages stages;
+    stages.main = newStage(in, out);
+    return stages;
+}
+
+}  // namespace qvchain

@@ -1,0 +1,216 @@
+// The automatic video chain: what a job needs, then the filters in their order.
+#include <cmath>
+#include <utility>
+
+#include "core/engine/qvlog.h"
+#include "core/engine/qvregistry.h"
+#include "core/engine/qvutil.h"
+#include "core/engine/status.h"
+#include "core/filter/chainfilters.h"
+#include "core/filter/jobdescription.h"
+#include "core/filter/qvprocesspipe.h"
+#include "core/filter/qvprocessutil.h"
+#include "core/media/qvgeometry.h"
+#include "core/value/qvassert.h"
+
+namespace {
+
+constexpr int hdLines = 720;  // from here on a picture of unknown matrix counts as BT.709
+
+// Rates closer than this are one rate.
+constexpr double sameRate = 0.001;
+
+enum class Matrix { keep, bt709To601, bt601To709 };
+
+using VideoFilterPtr = std::unique_ptr<QvVideoFilter>;
+
+class VideoChain {
+  public:
+    explicit VideoChain(const VideoJobDescription& job)
+        : job_(job),
+          width_(job.inWidth),
+          height_(job.inHeight),
+          interlaced_(job.inFramerate.interlaced() != 0) {}
+
+    bool plan();
+    void fill(QvVProcessPipe& pipe);
+
+  private:
+    const AnyDict* activeState(const char* name) const;
+    VideoFilterPtr restoreFixed(const char* name) const;
+    void planCropper();
+    void planDeinterlace();
+    void dropField();
+    Matrix matrix() const;
+    void planScaler();
+    void planRate();
+    void planCustom();
+    void append(QvVProcessPipe& pipe, VideoFilterPtr filter) const;
+
+    const VideoJobDescription& job_;
+    int width_;  // of the picture at this place of the chain
+    int height_;
+    bool interlaced_;
+    VideoFilterPtr flipper_, cropper_, deinterlace_, scaler_;
+    qvchain::RateStages rate_;
+    qvchain::VideoFilters front_, back_;
+};
+
+// Everything that a job needs; false when it needs nothing.
+bool VideoChain::plan() {
+    flipper_ = restoreFixed("flipper");
+    planCropper();
+    planDeinterlace();
+    dropField();
+    planScaler();
+    planRate();
+    planCustom();
+    return scaler_ || rate_.main || flipper_ || deinterlace_ || cropper_ || !front_.empty() || !back_.empty();
+}
+
+const AnyDict* VideoChain::activeState(const char* name) const {
+    const Any& state = job_.filters.get(name);
+    return state.isDict() && state.asDict().get("_on").isTrue() ? &state.asDict() : nullptr;
+}
+
+VideoFilterPtr VideoChain::restoreFixed(const char* name) const {
+    const auto* state = activeState(name);
+    if (!state) return nullptr;
+    auto filter = qvchain::newVideoFilter(name);
+    if (filter) filter->restore(*state);
+    return filter;
+}
+
+void VideoChain::planCropper() {
+    const auto* state = activeState("cropper");
+    if (!state) return;
+    cropper_ = qvchain::newVideoFilter("cropper");
+    // Without it the picture would come out uncut, which nobody asked for.
+    QV_ASSERT_MSG(cropper_, "filter module 'cropper' is not available");
+    cropper_->setParam("inputWidth", width_);
+    cropper_->setParam("inputHeight", height_);
+    cropper_->setParam("inputFrameAspect", job_.inFrameAspect);
+    cropper_->restore(*state);
+    width_ = cropper_->getParam("outputWidth").asInt32(width_);
+    height_ = cropper_->getParam("outputHeight").asInt32(height_);
+}
+
+// Half the lines, even, so that 4:2:0 chroma has whole lines.
+int halfHeight(int height) { return (height / 2) & ~1; }
+
+bool halvesHeight(const Any& method) {
+    if (method.isInt32()) return method.asInt32() == 1 || method.asInt32() == 2 || method.asInt32() == 4;
+    return method == "top" || method == "bottom" || method == "bob";
+}
+
+void VideoChain::planDeinterlace() {
+    deinterlace_ = restoreFixed("deinterlace");
+    if (!deinterlace_) return;
+    if (halvesHeight(deinterlace_->getParam("deinterlace"))) height_ = halfHeight(height_);
+    interlaced_ = false;
+}
+
+// When scaling would throw half the lines away anyway, one field serves.
+void VideoChain::dropField() {
+    if (job_.outFramerate.interlaced() != 0 || !interlaced_ || deinterlace_) return;
+    if (job_.outHeight > height_ / 2) return;
+    deinterlace_ = qvchain::newVideoFilter("deinterlace");
+    if (!deinterlace_) return;
+    deinterlace_->setParam("deinterlace", "top");
+    height_ = halfHeight(height_);
+    interlaced_ = false;
+}
+
+Matrix VideoChain::matrix() const {
+    const int in = job_.inITU;
+    const int out = job_.outITU;
+    const bool inHd = height_ >= hdLines;
+    const bool outHd = job_.outHeight >= hdLines;
+    if (in == 2 && out == 1) return Matrix::bt709To601;
+    if (in == 1 && out == 2) return Matrix::bt601To709;
+    // One known side bars the direction that contradicts it.
+    if (in != 1 && out != 2 && inHd && !outHd) return Matrix::bt709To601;
+    if (in != 2 && out != 1 && !inHd && outHd) return Matrix::bt601To709;
+    return Matrix::keep;
+}
+
+void VideoChain::planScaler() {
+    const Matrix direction = matrix();
+    if (width_ == job_.outWidth && height_ == job_.outHeight && job_.topBlankingLines == 0 &&
+        job_.inFOURCC == job_.outFOURCC && direction == Matrix::keep)
+        return;
+    scaler_ = qvchain::requireConverter("scaler", "scaler");
+    scaler_->setParam("outWidth", job_.outWidth);
+    scaler_->setParam("outHeight", job_.outHeight);
+    scaler_->setParam("topBlankingLines", job_.topBlankingLines);
+    scaler_->setParam("FOURCC", static_cast<int>(job_.outFOURCC));
+    if (direction == Matrix::keep) return;
+    scaler_->setParam("inITU", direction == Matrix::bt709To601 ? 2 : 1);
+    scaler_->setParam("outITU", direction == Matrix::bt709To601 ? 1 : 2);
+}
+
+void VideoChain::planRate() {
+    if (std::fabs(job_.inFramerate.rate().ratio() - job_.outFramerate.rate().ratio()) <= sameRate) return;
+    QvFramerate in = job_.inFramerate;
+    if (!interlaced_) in.setInterlaced(0);
+    rate_ = qvchain::chooseRateStages(in, job_.outFramerate);
+}
+
+void VideoChain::planCustom() {
+    const Any& custom = job_.filters.get("customFilters");
+    if (!custom.isVector()) return;
+    AnyVector front;
+    AnyVector back;
+    QvUtil::getSortedEffects(custom.asVector(), front, back, true);
+    front_ = qvchain::restoreVideoFilters(front);
+    back_ = qvchain::restoreVideoFilters(back);
+}
+
+void VideoChain::append(QvVProcessPipe& pipe, VideoFilterPtr filter) const {
+    if (filter) pipe.addFilter(filter.release(), -1);
+}
+
+void VideoChain::fill(QvVProcessPipe& pipe) {
+    for (auto& filter : front_) append(pipe, std::move(filter));
+    const double in = job_.inFramerate.rate();
+    const double out = job_.outFramerate.rate();
+    // A rate reduction runs first, so that no frame is scaled in vain.
+    if (in > out && !rate_.behindScaler) append(pipe, std::move(rate_.main));
+    append(pipe, std::move(flipper_));
+    append(pipe, std::move(cropper_));
+    append(pipe, std::move(deinterlace_));
+    append(pipe, std::move(scaler_));
+    append(pipe, std::move(rate_.pre));
+    append(pipe, std::move(rate_.main));
+    for (auto& filter : back_) append(pipe, std::move(filter));
+}
+
+}  // namespace
+
+QvVProcessPipe* QvProcessUtil::createVideoPipe(const VideoJobDescription& job) {
+    return createVideoPipeAux(job, nullptr, false);
+}
+
+QvVProcessPipe* QvProcessUtil::createVideoPipeMV(const VideoJobDescription& job, int nrViews) {
+    if (nrViews < 2) return createVideoPipe(job);
+    std::unique_ptr<QvVProcessPipe> pipe(createVideoPipeAux(job, "mvprocess", true));
+    if (!pipe) return nullptr;
+    pipe->setParam("nrViews", nrViews);
+    pipe->setParam("jobDescription", Any(static_cast<const void*>(&job)));
+    if (pipe->open() == QvStatus::ok) return pipe.release();
+    qv_dbg()->error("Can not open the video pipe for %d views: %s", nrViews, pipe->errorDesc());
+    return nullptr;
+}
+
+QvVProcessPipe* QvProcessUtil::createVideoPipeAux(const VideoJobDescription& job, const char* moduleName,
+                                                  bool deferOpen) {
+    VideoChain chain(job);
+    if (!chain.plan()) return nullptr;
+    std::unique_ptr<QvCodec> codec(qv_registry()->newCodec(moduleName ? moduleName : "vprocess"));
+    auto* pipe = dynamic_cast<QvVProcessPipe*>(codec.get());
+    QV_ASSERT_MSG(pipe, "invalid name for vprocess module");
+    chain.fill(*pipe);
+    if (!deferOpen) QV_ASSERT_MSG(pipe->open() == QvStatus::ok, pipe->errorDesc());
+    codec.release();
+    return pipe;
+}

@@ -1,0 +1,249 @@
+#include <algorithm>
+#include <bit>
+#include <cstdint>
+#include <cstring>
+#include <iterator>
+#include <map>
+#include <memory>
+#include <utility>
+
+#include "core/value/anycontainer.h"
+#include "core/value/astring.h"
+#include "core/value/qvassert.h"
+
+namespace {
+
+// The first eight bytes of a key as one number that sorts as they do: signed bytes, a missing byte first.
+std::uint64_t headOf(std::string_view key) {
+    std::uint64_t head = 0;
+    const std::size_t count = std::min<std::size_t>(key.size(), 8);
+    for (std::size_t i = 0; i < count; ++i) head = head << 8 | (static_cast<unsigned char>(key[i]) ^ 0x80u);
+    return count == 0 ? 0 : head << (64 - 8 * count);
+}
+
+struct SoughtKey {
+    std::uint64_t head;
+    std::string_view text;
+
+    explicit SoughtKey(std::string_view key) : head(headOf(key)), text(key) {}
+    std::string_view view() const { return text; }
+};
+
+// A stored key lies whole in its tree node.
+struct StoredKey {
+    std::uint64_t head;
+    std::uint32_t length;
+    AString<AnyDict::maxKeyLength> text;
+
+    explicit StoredKey(std::string_view key)
+        : head(headOf(key)), length(static_cast<std::uint32_t>(key.size())), text(key.data()) {}
+    std::string_view view() const { return {text.c_str(), length}; }
+};
+
+// By signed bytes over the shorter length, then the shorter first. Equal heads do not mean equal bytes: a
+// missing byte looks like the lowest one, so the lengths have the last word.
+struct KeyOrder {
+    using is_transparent = void;
+
+    template <class A, class B>
+    bool operator()(const A& a, const B& b) const {
+        if (a.head != b.head) return a.head < b.head;
+        const std::string_view x = a.view();
+        const std::string_view y = b.view();
+        const std::size_t common = std::min(x.size(), y.size());
+        for (std::size_t i = 8; i < common; ++i)
+            if (x[i] != y[i]) return static_cast<signed char>(x[i]) < static_cast<signed char>(y[i]);
+        return x.size() < y.size();
+    }
+};
+
+using Tree = std::map<StoredKey, Any, KeyOrder>;
+
+// An iterator of the tree is one pointer, which is how AnyDict::iterator carries it.
+static_assert(sizeof(Tree::iterator) == sizeof(void*) && std::is_trivially_copyable_v<Tree::iterator>);
+Tree::iterator treeIterator(void* node) { return std::bit_cast<Tree::iterator>(node); }
+
+}  // namespace
+
+struct AnyDict::Impl {
+    Tree tree;
+};
+
+AnyDict& AnyDict::null() {
+    static AnyDict& shared = *[] {
+        static AnyDict made;
+        made.impl_ = new Impl;
+        return &made;
+    }();
+    return shared;
+}
+
+AnyDict::AnyDict(const AnyDict& other) {
+    if (!other.empty()) impl_ = new Impl(*other.impl_);
+}
+
+AnyDict::AnyDict(AnyDict&& other) noexcept {
+    if (!other.isNull()) impl_ = std::exchange(other.impl_, nullptr);
+}
+
+AnyDict::~AnyDict() { delete impl_; }
+
+AnyDict& AnyDict::operator=(const AnyDict& other) {
+    QV_ASSERT(!isNull());
+    if (this != &other) *this = AnyDict(other);
+    return *this;
+}
+
+// The old entries go last: `other` may be in one of them.
+AnyDict& AnyDict::operator=(AnyDict&& other) {
+    QV_ASSERT(!isNull());
+    if (this == &other) return *this;
+    AnyDict taken(std::move(other));
+    std::swap(impl_, taken.impl_);
+    return *this;
+}
+
+AnyDict::Impl& AnyDict::writable() {
+    if (!impl_)
+        impl_ = new Impl;
+    else
+        QV_ASSERT(!isNull());
+    return *impl_;
+}
+
+bool AnyDict::isNull() const { return impl_ && impl_ == null().impl_; }
+int AnyDict::size() const { return impl_ ? static_cast<int>(impl_->tree.size()) : 0; }
+
+Any* AnyDict::lookup(std::string_view key) const {
+    if (!impl_ || key.size() > maxKeyLength) return nullptr;
+    const auto found = impl_->tree.find(SoughtKey(key));
+    return found == impl_->tree.end() ? nullptr : &found->second;
+}
+
+Any& AnyDict::get(const char* key) {
+    Any* const found = key ? lookup(key) : nullptr;
+    return found ? *found : Any::invalid();
+}
+
+const Any& AnyDict::get(const char* key) const {
+    const Any* const found = key ? lookup(key) : nullptr;
+    return found ? *found : Any::invalid();
+}
+
+bool AnyDict::isSet(const char* key) const { return key && lookup(key); }
+
+// The entry of a key, made if need be.
+Any& AnyDict::slot(const char* key) {
+    QV_ASSERT(key);
+    Tree& tree = writable().tree;
+    const SoughtKey sought(std::string_view(key, strnlen(key, maxKeyLength)));
+    const auto place = tree.lower_bound(sought);
+    if (place != tree.end() && !KeyOrder()(sought, place->first)) return place->second;
+    return tree.try_emplace(place, StoredKey(sought.text))->second;
+}
+
+// A container is copied before its entry is made: it may hold this dictionary.
+Any& AnyDict::set(const char* key, const Any& value) {
+    if (value.isDict() || value.isVector()) return set(key, Any(value));
+    return slot(key) = value;
+}
+Any& AnyDict::set(const char* key, Any&& value) { return slot(key) = std::move(value); }
+Any& AnyDict::set(const char* key, const AnyDict& value) { return set(key, Any(value)); }
+Any& AnyDict::set(const char* key, AnyDict&& value) { return set(key, Any(std::move(value))); }
+Any& AnyDict::set(const char* key, const AnyVector& value) { return set(key, Any(value)); }
+Any& AnyDict::set(const char* key, AnyVector&& value) { return set(key, Any(std::move(value))); }
+
+void AnyDict::remove(const char* key) {
+    if (!isSet(key)) return;
+    Tree& tree = writable().tree;
+    tree.erase(tree.find(SoughtKey(key)));
+}
+
+void AnyDict::clear() { writable().tree.clear(); }
+
+void AnyDict::update(const AnyDict& other) {
+    AnyDict copy(other);
+    for (auto [key, value] : copy) set(key, std::move(*value));
+}
+
+void AnyDict::swap(AnyDict& other) {
+    if (isNull()) {
+        other.writable();  // so that the sentinel keeps one to be told by
+        delete std::exchange(impl_, new Impl);
+    }
+    std::swap(impl_, other.impl_);
+}
+
+int AnyDict::getInt32(const char* key, int otherwise) const { return get(key).asInt32(otherwise); }
+long long AnyDict::getInt64(const char* key, long long otherwise) const {
+    return get(key).asInt64(otherwise);
+}
+double AnyDict::getDouble(const char* key, double otherwise) const { return get(key).asDouble(otherwise); }
+const char* AnyDict::getString(const char* key, const char* otherwise) const {
+    return get(key).asString(otherwise);
+}
+const unsigned short* AnyDict::getWString(const char* key, const unsigned short* otherwise) const {
+    return get(key).asWString(otherwise);
+}
+const AnyVector& AnyDict::getVector(const char* key, const AnyVector& otherwise) const {
+    const Any& value = get(key);
+    return value.isVector() ? value.asVector() : otherwise;
+}
+const AnyDict& AnyDict::getDict(const char* key, const AnyDict& otherwise) const {
+    const Any& value = get(key);
+    return value.isDict() ? value.asDict() : otherwise;
+}
+
+AnyDict::Entry AnyDict::getEntry(int position) const {
+    if (position < 0 || position >= size()) return {nullptr, &Any::invalid()};
+    return *iterator(std::bit_cast<void*>(std::next(impl_->tree.begin(), position)));
+}
+
+const char* AnyDict::getKey(int position) const { return getEntry(position).key; }
+Any& AnyDict::getVal(int position) { return *getEntry(position).value; }
+const Any& AnyDict::getVal(int position) const { return *getEntry(position).value; }
+
+void AnyDict::getKeyVal(int position, Any& key, Any& value) const {
+    const Entry entry = getEntry(position);
+    if (entry.key) {
+        key = entry.key;
+        value = *entry.value;
+    } else {
+        key.invalidate();
+        value.invalidate();
+    }
+}
+
+int AnyDict::find(const Any& value) const {
+    int position = 0;
+    for (const Entry entry : *this) {
+        if (*entry.value == value) return position;
+        ++position;
+    }
+    return -1;
+}
+
+bool AnyDict::operator==(const AnyDict& other) const {
+    if (impl_ == other.impl_) return true;
+    const auto equal = [](Entry a, Entry b) {
+        return std::strcmp(a.key, b.key) == 0 && *a.value == *b.value;
+    };
+    return size() == other.size() && std::equal(begin(), end(), other.begin(), equal);
+}
+
+AnyDict::iterator AnyDict::begin() const {
+    return impl_ ? iterator(std::bit_cast<void*>(impl_->tree.begin())) : iterator();
+}
+AnyDict::iterator AnyDict::end() const {
+    return impl_ ? iterator(std::bit_cast<void*>(impl_->tree.end())) : iterator();
+}
+
+AnyDict::Entry AnyDict::iterator::operator*() const {
+    auto& [key, value] = *treeIterator(node_);
+    return {key.text.c_str(), &value};
+}
+
+AnyDict::iterator& AnyDict::iterator::operator++() {
+    node_ = std::bit_cast<void*>(std::next(treeIterator(node_)));
+    return *this;
+}

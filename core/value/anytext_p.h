@@ -1,0 +1,39 @@
+// Views of the text that an Any holds, up to its first NUL, and the way back. Empty for other types.
+#pragma once
+
+#include <algorithm>
+#include <span>
+#include <string_view>
+#include <vector>
+
+#include <string.h>
+
+#include "core/value/any.h"
+#include "core/value/qvassert.h"
+
+using QvWideView = std::span<const unsigned short>;
+
+inline std::string_view qvNarrowView(const Any& value) {
+    if (!value.isString()) return {};
+    return {value.asString(), strnlen(value.asString(), static_cast<std::size_t>(value.size()))};
+}
+
+inline QvWideView qvWideView(const Any& value) {
+    if (!value.isWString()) return {};
+    const unsigned short* text = value.asWString();
+    const auto size = static_cast<std::size_t>(value.size());
+    return {text, static_cast<std::size_t>(std::find(text, text + size, 0) - text)};
+}
+
+inline int qvTextLength(std::size_t length) {
+    QV_ASSERT(length < 0x7FFFFFFF);
+    return static_cast<int>(length);
+}
+
+inline Any qvTextOf(std::string_view text) {
+    return text.empty() ? Any("") : Any(text.data(), qvTextLength(text.size()));
+}
+inline Any qvTextOf(QvWideView text) {
+    constexpr unsigned short nothing = 0;
+    return text.empty() ? Any(&nothing) : Any(text.data(), qvTextLength(text.size()));
+}
