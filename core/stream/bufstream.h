@@ -32,7 +32,7 @@ struct bufstream {
     void (*free)(struct bufstream* self);            /* releases the record; null: its owner does */
     void* reserved[2];                               /* zero */
     unsigned flags;                                  /* BUFSTREAM_WRITER or 0 */
-    unsigned (*state)(struct bufstream* self);       /* null in all records of the engine */
+    unsigned (*state)(struct bufstream* self);       /* null in FIFOs and files */
     void* context;                                   /* the object behind the record */
 };
 

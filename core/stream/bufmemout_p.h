@@ -1,0 +1,32 @@
+// The writer's side of a memory output.
+#pragma once
+
+#include <memory>
+
+#include "core/stream/buf_impl_base.h"
+#include "core/stream/bytefifo_p.h"
+#include "core/stream/qvbufmem.h"
+
+class BufMemOut : public Bufstream {
+  public:
+    explicit BufMemOut(QvAuxinfoQueue* queue) : queue_(queue) {}
+
+    int init() override;  // QvStatus::outOfMemory without memory for the ring
+    unsigned usable() override { return ring_->room(); }
+    unsigned char* request(unsigned n) override;
+    unsigned confirm(unsigned n) override;
+    unsigned copybytes(unsigned char* p, unsigned n) override;
+    unsigned chunksize() override { return ring_->start; }
+    unsigned auxinfo(unsigned offset, unsigned id, void* info, unsigned size) override;
+    unsigned split() override { return 0; }
+    void done(int) override {}
+    void free() override {}
+
+  private:
+    unsigned queueAccessUnit(unsigned id, const void* info, unsigned size);
+    void queueInfo(unsigned id, void* info, unsigned size);
+    void takePayload(unsigned char* target, unsigned bytes);
+
+    std::unique_ptr<bytefifo> ring_;
+    QvAuxinfoQueue* queue_;
+};

@@ -1,0 +1,25 @@
+#include "core/stream/iofailure.h"
+
+#include <cerrno>
+#include <system_error>
+
+#include "core/engine/qvlog.h"
+
+bool QvIoFailure::keep(int code, const char* what, const QvWideString& name) {
+    if (code_) return false;
+    code_ = code ? code : EIO;
+    text_ = std::string(what) + " '" + qv_narrow_name(name.data(), name.size()) +
+            "': " + std::generic_category().message(code_);
+    return true;
+}
+
+void QvIoFailure::report(int code, const char* what, const QvWideString& name) {
+    if (keep(code, what, name)) qv_log()->logs(QvLogMask::error, text_.c_str());
+}
+
+void QvIoFailure::note(int code, const char* what, const QvWideString& name) { keep(code, what, name); }
+
+void QvIoFailure::clear() {
+    code_ = 0;
+    text_.clear();
+}
