@@ -1,6 +1,7 @@
 #include "core/stream/auxinfoid.h"
 
 #include <algorithm>
+#include <iterator>
 
 namespace {
 

@@ -3,6 +3,8 @@
 
 #include <cstddef>
 #include <memory>
+#include <new>
+#include <type_traits>
 
 #include "core/stream/bufstream.h"
 #include "core/stream/bytefifo_p.h"

@@ -1,0 +1,18 @@
+// The record in front of a file that is written: collects patches, hands side information to observers.
+#pragma once
+
+#include <memory>
+
+#include "core/stream/bufstream.h"
+#include "core/stream/iofailure.h"
+
+using AuxInfoCallback = void (*)(void* context, unsigned offset, unsigned id, void* info, unsigned size);
+
+// Null if `inner` has no name, or there is no memory. `inner` is borrowed: all goes on to it but
+// BUF_SEEK_INFO and BUF_SEEK_REORDER, whose data are copied; the result of auxinfo is always 0. `callback`
+// then hears of each item.
+//
+// done(abort) opens the file anew, so it runs after the file's own done(), and writes the patches in their
+// order, none with `abort`, and then makes the block move, even then. Failures are noted in `failure`.
+bufstream* seekPatchNew(bufstream* inner, AuxInfoCallback callback, void* context,
+                        std::shared_ptr<QvIoFailure> failure);

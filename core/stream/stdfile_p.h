@@ -1,0 +1,37 @@
+// A file of the C library that closes itself and keeps the reason of a failure.
+#pragma once
+
+#include <cstddef>
+#include <cstdio>
+
+#include "core/arch/widename.h"
+
+class StdFile {
+  public:
+    StdFile() = default;
+    ~StdFile() { close(); }
+    StdFile(const StdFile&) = delete;
+    StdFile& operator=(const StdFile&) = delete;
+
+    // Results are false, or short, on failure; error() then has the reason as an errno value.
+    bool open(const QvWideString& name, const char* mode);
+    bool isOpen() const { return file_ != nullptr; }
+    bool write(const void* data, size_t bytes) { return writeSome(data, bytes) == bytes; }
+    size_t writeSome(const void* data, size_t bytes);
+    size_t read(void* data, size_t bytes);
+    bool readAll(void* data, size_t bytes);  // fewer bytes than asked for are a failure too
+    bool seek(long long offset, int origin);
+    long long tell();    // -1 on failure
+    long long length();  // keeps the position; -1 on failure
+    bool flush();
+    // False if what the C library still held could not be written. True for a file that isn't open.
+    bool close();
+    bool failedRead() const { return file_ && std::ferror(file_); }
+    int error() const { return error_; }
+
+  private:
+    bool check(bool ok);
+
+    std::FILE* file_ = nullptr;
+    int error_ = 0;
+};
