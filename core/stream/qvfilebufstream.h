@@ -7,6 +7,7 @@
 
 #include <memory>
 
+#include "core/arch/widename.h"
 #include "core/stream/qvbufstrm.h"
 
 // Reads the file "infilename" if that is set; otherwise writes "outfilename".
@@ -35,11 +36,18 @@ class QV_API QvFileBufStream : public QvBufStream {
     int unregisterAllObservers() override;
     TPtrList<QvAuxInfoObserver>* observers() override;
 
+    // Brings what is buffered to the file system and goes on. 0, or -1 with ioError() on failure and when
+    // reading. Records confirm into the buffer, so a full disc may show only here or in destroy().
+    int writeOut();
+
   protected:
     struct Records;
     std::shared_ptr<Records> records_;
 
   private:
+    int openOutput(const QvWideString& name);
+    int openInput(const QvWideString& name);
+
     TPtrList<QvAuxInfoObserver> observers_;
 };
 
