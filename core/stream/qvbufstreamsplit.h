@@ -6,15 +6,11 @@
 // ioError().
 #pragma once
 
-#include <array>
-#include <cstdio>
 #include <memory>
 
-#include "core/media/qvbuffer.h"
 #include "core/stream/qvbuffifo.h"
-#include "core/stream/qvfilebufstream.h"
 
-class QvColorConverter;
+class QvFileBufStream;
 
 // Parameters: "outfilename"; "split" Int32 0 for a plain file, anything else for files NAME#0.EXT, NAME#1.EXT
 // and so on; "nrDigits" (Int32), width of the number, with zeros in front; "png" true to write each access
@@ -41,27 +37,24 @@ class QV_API QvBsSplitVideo : public QvBufStreamFifoCb {
 
   private:
     int initPlain(const AnyDict& params);
-    void initPicture();
     Any _currentFilename() const;
     void writeAccessUnit(unsigned bytes);
-    void writePicture(bufstream* ring, unsigned bytes, const Any& name);
-    void writeFile(bufstream* ring, unsigned bytes, const Any& name);
+    bool writePicture(bufstream* ring, unsigned bytes, const Any& name);
+    bool writeFile(bufstream* ring, unsigned bytes, const Any& name);
 
     TPtrList<QvAuxInfoObserver> observers_;
     int fileCounter_ = 0;
     int nrDigits_ = 0;
-    Any baseName_, extension_, path_;
+    Any baseName_, extension_, path_;  // parts of "outfilename"
     bool split_ = false;
     bool png_ = false;
     int width_ = 0, height_ = 0;
     unsigned fourcc_ = 0;
     std::unique_ptr<QvFileBufStream> inner_;  // null in split mode
-    std::unique_ptr<QvColorConverter> converter_;
-    std::unique_ptr<QvFrame> converted_;
 };
 
 // Parameters: "outfilename"; "isPcm" Int32 0 for a plain file, anything else for WAV; "split" true for one
-// mono file for each channel, NAME#00.EXT, NAME#01.EXT and so on, at most 32; "samplerate", "channels",
+// mono file for each channel, NAME#00.EXT, NAME#01.EXT and so on, at most 32; "samplerate", "channels" and
 // "bitsPerSample" (20 bits stand in 3 bytes).
 //
 // The header is written when STREAM_END_CODE comes; before that the file has 80 zero bytes in its place. Size
@@ -74,7 +67,7 @@ class QV_API QvBsSplitAudio : public QvBufStreamFifoCb {
     ~QvBsSplitAudio() override;
 
     using QvBufStream::init;
-    int init(const AnyDict& params) override;
+    int init(const AnyDict& params) override;  // -1 for a format that no WAV can hold, and without a file
     void destroy(int abort) override;
     void flush() override;
     bufstream* input() override;
@@ -84,30 +77,21 @@ class QV_API QvBsSplitAudio : public QvBufStreamFifoCb {
     void cbAuxinfo(unsigned offset, unsigned id, void* info, unsigned size) override;
 
   private:
+    struct Wav;
+
     int initPlain(const AnyDict& params);
-    int initPcm(const AnyDict& params);
-    bool readFormat();
-    int openFile(int index, const Any& name);
-    int fileCount() const { return split_ ? channels_ : 1; }
-    Any _fileName(int index) const;
-    Any _channelFileName(int channel) const;
-    void _onAudioBytes(const void* info, unsigned size);
+    bool openFiles();
+    bool openFile(const Any& name);
+    static Any _channelFileName(const Any& name, int channel);
+    void _onAudioBytes(unsigned bytes);
     bool writeInterleaved(bufstream* ring, unsigned bytes);
     bool writeChannels(bufstream* ring, unsigned bytes);
-    bool writeItem(int index, const void* data, size_t bytes);
+    bool takeSamples(bufstream* ring, unsigned bytes);
+    bool writeItem(int file, const unsigned char* data, unsigned bytes);
     void onStreamEnd();
-    void closeFile(int index);
+    bool closeFile(int file);
     void _writeWavHeaders();
 
-    Any baseName_, extension_, path_;  // without "split" baseName_ is the whole name
-    std::array<std::FILE*, maxFiles> files_{};
-    std::array<QvPcm, maxFiles> channelBuffers_;
-    bool split_ = false;
-    bool ring_ = false;
-    QvPcm work_;
+    std::unique_ptr<Wav> wav_;                // null unless the ring is used
     std::unique_ptr<QvFileBufStream> inner_;  // null when the ring is used
-    int bitsPerSample_ = 0;
-    int channels_ = 0;
-    int samplerate_ = 0;
-    unsigned carried_ = 0;  // bytes of an incomplete sample at the head of the ring
 };

@@ -82,6 +82,8 @@ class QV_API QvBufStream {
     // The entry as Int32; if it has another type or is absent, `fallback`, which is stored.
     int int32Param(const char* name, int fallback);
     const std::shared_ptr<QvIoFailure>& failure() const { return failure_; }
+    // Failures of `inner`, which stands behind this stream, count as this one's.
+    void shareFailure(QvBufStream& inner) const { inner.failure_ = failure_; }
 
   private:
     std::shared_ptr<QVThreads::QvCriticalSection> lock_;
