@@ -2,7 +2,10 @@
 file(GLOB_RECURSE QV_SOURCES CONFIGURE_DEPENDS
      ${CMAKE_SOURCE_DIR}/core/*.cpp ${CMAKE_SOURCE_DIR}/builtin/*.cpp)
 
+include(cmake/soundbytes.cmake)
 add_library(qv_objects OBJECT ${QV_SOURCES})
+add_dependencies(qv_objects qv_sounds)
+target_include_directories(qv_objects PRIVATE ${CMAKE_BINARY_DIR}/generated)
 target_compile_definitions(qv_objects PRIVATE QV_BUILDING_LIBRARY)
 target_include_directories(qv_objects PUBLIC ${CMAKE_SOURCE_DIR})
 target_link_libraries(qv_objects PUBLIC
