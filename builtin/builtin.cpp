@@ -39,7 +39,7 @@ constexpr QvBuiltinRow registered[] = {
     {"timecode",     videoFilter,  "Timecode inserter",              "Timecode",                   nullptr},
     {"subimport",    decoder,      "Text subtitle importer",         "Subtitle import",            nullptr,
      {.exts = "sub srt", .priority = 10}},
-    {"testgen",      decoder,      "Test stream generator",          "Test input",                 nullptr,
+    {"testgen",      decoder,      "Test stream generator",          "Test input",                 newTestgen,
      {.exts = "", .priority = 10, .skipAuto = true, .internal = true}},
     {"chconvert",    audioFilter,  "Audio channel number converter", "Channel mapping",            nullptr},
     {"aquant",       audioFilter,  "Audio quantization converter",   "Change sample format",       nullptr},

@@ -6,6 +6,7 @@
 
 class QvCodec;
 QvCodec* newRawdec();
+QvCodec* newTestgen();
 QvCodec* newWavdec();
 QvCodec* newFilesink();
 QvCodec* newNullsink();
