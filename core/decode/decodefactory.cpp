@@ -1,0 +1,224 @@
+#include "core/decode/decodefactory.h"
+
+#include <memory>
+
+#include "core/decode/qvdecoder.h"
+#include "core/encode/qvencodepipe.h"
+#include "core/engine/qvexception.h"
+#include "core/engine/qvfileutil.h"
+#include "core/engine/qvlog.h"
+#include "core/engine/qvmodule.h"
+#include "core/engine/qvregistry.h"
+#include "core/engine/status.h"
+#include "core/value/qvassert.h"
+
+namespace {
+
+// Names as they are shown: one, or all of a Vector.
+Any shownNames(const Any& filename) {
+    const Any text = (filename.isVector() ? filename.asVector().join(", ") : filename).toString();
+    return text.isString() ? text : Any("");
+}
+
+Any extensionOf(const Any& filename) {
+    if (filename.isText()) return QvFile::getExt(filename, true);
+    if (filename.isVector())
+        for (const Any& name : filename.asVector()) {
+            if (!name.isText()) continue;
+            const Any ext = QvFile::getExt(name, true);
+            if (ext.size() > 0) return ext;
+        }
+    return Any("");
+}
+
+// The caller's callback, if there is one, and what it is told.
+class Reporter {
+  public:
+    Reporter(const Any& filename, QvFileOpenCb* callback) : callback_(callback) { data_.filename = filename; }
+
+    void started() {
+        if (callback_) callback_->fileOpenStarted(data_);
+    }
+    void started(const char* module) {
+        data_.moduleName = module;
+        started();
+    }
+    void failed(const Any& text) { finished(QvStatus::failed, text, 0); }
+    void succeeded(const Any& text, int percent) { finished(QvStatus::ok, text, percent); }
+
+  private:
+    QvFileOpenCb* callback_;
+    QvFileOpenCbData data_;
+
+    void finished(int result, const Any& text, int percent) {
+        data_.text = text;
+        data_.percent = percent;
+        if (callback_) callback_->fileOpenFinished(result, data_);
+    }
+};
+
+Any failedToOpen(const Any& filename, const char* decoder) {
+    return Any::sprintf("Failed to open file '%s' using '%s'.", shownNames(filename).asString(), decoder);
+}
+
+Any opened(const Any& filename, const char* decoder) {
+    return Any::sprintf("Successfully opened file '%s' with decoder '%s'.", shownNames(filename).asString(),
+                        decoder);
+}
+
+Any noInstance(const char* decoder) {
+    return Any::sprintf("Failed to create instance of decoder '%s'.", decoder);
+}
+
+void logError(const Any& text) { qv_dbg()->logs(QvLogMask::error, text.asString()); }
+
+void logOpening(const Any& filename) {
+    if (!filename.isVector()) {
+        qv_dbg()->debug("Opening file '%s' ...", shownNames(filename).asString());
+        return;
+    }
+    qv_dbg()->debug("Opening files:");
+    for (const Any& name : filename.asVector())
+        if (name.isString()) qv_dbg()->debug("   '%s' ...", name.asString());
+}
+
+// A decoder of this module, ready for parameters, or null with the failure reported.
+std::unique_ptr<QvDecodePipe> makeDecoder(QvModule& module, Reporter& reporter) {
+    std::unique_ptr<QvCodec> codec(module.create());
+    auto* decoder = codec ? static_cast<QvDecodePipe*>(codec->getInterface(QvModuleType::decoder)) : nullptr;
+    if (decoder && decoder->init() == QvStatus::ok) {
+        codec.release();
+        return std::unique_ptr<QvDecodePipe>(decoder);
+    }
+    const Any text = noInstance(module.displayName());
+    logError(text);
+    reporter.failed(text);
+    return nullptr;
+}
+
+void setUp(QvDecodePipe& decoder, const Any& filename, const Any& fourcc, const Any* openParams) {
+    if (openParams) {
+        try {
+            decoder.setParam("openParameters", *openParams);
+        } catch (const QvParamException&) {
+            qv_dbg()->error("Decoder %s does not support open parameters.", decoder.name());
+        }
+    }
+    decoder.setParam(filename.isVector() ? "filenames" : "filename", filename);
+    if (!fourcc.isValid()) return;
+    try {
+        decoder.setParam("FOURCC", fourcc);
+    } catch (const QvParamException&) {  // only few decoders can be told
+    }
+}
+
+void applyOverrides(QvDecodePipe& decoder, int type, const Any& saved) {
+    if (!saved.isVector()) return;
+    const AnyVector& streams = saved.asVector();
+    for (int n = 0; n < decoder.nrStreams(type); ++n) {
+        if (!streams.at(n).isDict()) continue;
+        int stream = 0;  // the entry's position, see the header
+        for (const auto [key, value] : streams.at(n).asDict()) {
+            if (stream < decoder.nrStreams(type))
+                decoder.setOverride(type, stream, key, *value);
+            else
+                qv_dbg()->warning("[DecFactory] no stream %d to override %s of", stream, key);
+            ++stream;
+        }
+    }
+}
+
+}  // namespace
+
+QvDecodePipe* QvDecFactory::decodePipe(const Any& filename, const Any& fourcc, QvFileOpenCb* cb,
+                                       const Any* openParams) {
+    const Any ext = extensionOf(filename);
+    if (ext.size() == 0)
+        qv_dbg()->info("Cannot determine file extension from filename '%s', will use default decoder.",
+                       shownNames(filename).asString());
+    const AnyVector modules = qv_registry()->decoders(ext.asString(""));
+    if (!modules.empty()) return decodePipeUsing(filename, modules, fourcc, cb, openParams);
+
+    const Any text = Any::sprintf("Cannot find appropriate decoder for extension '%s'.", ext.asString(""));
+    logError(text);
+    Reporter reporter(filename, cb);
+    reporter.started();
+    reporter.failed(text);
+    return nullptr;
+}
+
+QvDecodePipe* QvDecFactory::decodePipeUsing(const Any& filename, const AnyVector& modules, const Any& fourcc,
+                                            QvFileOpenCb* cb, const Any* openParams) {
+    logOpening(filename);
+    Reporter reporter(filename, cb);
+    for (const Any& name : modules) {
+        const char* moduleName = name.asString("");
+        QvModule* module = qv_registry()->module(moduleName);
+        if (!module) {
+            qv_dbg()->error("Non-existing module '%s' specified", moduleName);
+            QV_FAIL_PLAIN();
+        }
+        reporter.started(moduleName);
+        std::unique_ptr<QvDecodePipe> decoder = makeDecoder(*module, reporter);
+        if (!decoder) continue;
+        setUp(*decoder, filename, fourcc, openParams);
+        if (decoder->open() == QvStatus::ok) {
+            const Any text = opened(filename, decoder->name());
+            qv_dbg()->logs(QvLogMask::info, text.asString());
+            reporter.succeeded(text, 100);
+            return decoder.release();
+        }
+        const Any text = failedToOpen(filename, decoder->name());
+        logError(text);
+        reporter.failed(text);
+    }
+    return nullptr;
+}
+
+QvDecodePipe* QvDecFactory::restoreDecoder(const Any& filename, const AnyDict& state, QvFileOpenCb* cb) {
+    QV_ASSERT_MSG(state["name"].isString(),
+                  "DecFactory.restoreDecoder: Restore failed, no module name given.");
+    const char* name = state["name"].asString();
+    Reporter reporter(filename, cb);
+    reporter.started(name);
+    const auto fail = [&reporter](const Any& text) {
+        logError(text);
+        reporter.failed(text);
+        return nullptr;
+    };
+
+    if (state["name"] != "testgen" && !QvFile::isFile(filename)) {
+        const Any text = Any::sprintf("Cannot find file '%s'.", shownNames(filename).asString());
+        qv_dbg()->error("[DecFactory] %s", text.asString());
+        reporter.failed(text);
+        return nullptr;
+    }
+    std::unique_ptr<QvCodec> codec(qv_registry()->newCodec(name));
+    auto* decoder = codec ? static_cast<QvDecodePipe*>(codec->getInterface(QvModuleType::decoder)) : nullptr;
+    if (!decoder) return fail(noInstance(name));
+    decoder->restore(state);
+    decoder->setParam("filename", filename);
+    if (decoder->open() != QvStatus::ok) return fail(failedToOpen(filename, decoder->name()));
+
+    applyOverrides(*decoder, qvVideoStream, state["vidsOverride"]);
+    applyOverrides(*decoder, qvAudioStream, state["audsOverride"]);
+    applyOverrides(*decoder, qvSubpicStream, state["subsOverride"]);
+    const Any text = opened(filename, decoder->name());
+    qv_dbg()->logs(QvLogMask::info, text.asString());
+    reporter.succeeded(text, 0);
+    codec.release();
+    return decoder;
+}
+
+QvEncodePipe* QvEncFactory::encodePipe() {
+    std::unique_ptr<QvCodec> codec;
+    if (QvModule* module = qv_registry()->module("encpipe")) codec.reset(module->create());
+    if (!codec) {
+        qv_dbg()->error("[QvEncFactory]Internal error, there is no encode pipe module");
+        return nullptr;
+    }
+    codec->init();
+    return static_cast<QvEncodePipe*>(codec.release()->getInterface(QvModuleType::encodePipe));
+}
+
+QvEncodePipe* QvEncFactory::encodePipe(const AnyDict&) { return encodePipe(); }
