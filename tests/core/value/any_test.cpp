@@ -1,0 +1,369 @@
+#include "core/value/any.h"
+
+#include <gtest/gtest.h>
+
+#include <clocale>
+#include <limits>
+#include <string>
+#include <vector>
+
+#include "core/media/qvgeometry.h"
+#include "tests/core/value/value_support.h"
+
+namespace {
+
+constexpr int lowestInt = std::numeric_limits<int>::min();
+constexpr int highestInt = std::numeric_limits<int>::max();
+constexpr const void* noBytes = nullptr;
+constexpr double nan = std::numeric_limits<double>::quiet_NaN();
+
+// One value of each type, in the order of the type numbers.
+std::vector<Any> oneOfEach() {
+    static int borrowed = 0;
+    return {Any(),
+            Any(-5),
+            Any(2.5),
+            Any("text"),
+            Any(u"w\u00efde"),
+            Any(AnyDict("k", 1)),
+            Any(AnyVector(1, "b")),
+            Any(1LL << 40),
+            Any(static_cast<const void*>(&borrowed)),
+            Any(QvFramerate::f59i()),
+            Any(QvPoint(1, 2)),
+            Any(QvRect(1, 2, 3, 4)),
+            Any(QvBitrate(1, 2, 3, 4, 5)),
+            Any(Pair(6, 7)),
+            Any(MediaTime(9, 25))};
+}
+
+TEST(Any, sixteenBytes) { EXPECT_EQ(sizeof(Any), 16u); }
+
+TEST(Any, typeNumbersAndNames) {
+    const char* names[] = {"Invalid", "Int32",     "Float", "String", "WString", "Dict", "Vector",   "Int64",
+                           "Generic", "Framerate", "Point", "Rect",   "Bitrate", "Pair", "MediaTime"};
+    const auto values = oneOfEach();
+    for (std::size_t i = 0; i < values.size(); ++i) EXPECT_STREQ(Any::typeName(values[i].type()), names[i]);
+    for (int unknown : {-2, 11, 15, highestInt, lowestInt})
+        EXPECT_STREQ(Any::typeName(unknown), "*Unknown*") << unknown;
+}
+
+TEST(Any, copiesAndMovesOfEachTypeOverEachType) {
+    const auto values = oneOfEach();
+    for (const Any& from : values) {
+        for (const Any& over : values) {
+            Any copied = over;
+            copied = from;
+            EXPECT_EQ(copied, from) << Any::typeName(over.type());
+            Any source = from;
+            Any moved = over;
+            moved = std::move(source);
+            EXPECT_EQ(moved, from) << Any::typeName(over.type());
+            moved.invalidate();
+            EXPECT_EQ(moved, Any());
+        }
+    }
+}
+
+TEST(Any, aPartOfAValueMayReplaceTheWhole) {
+    Any value(AnyDict("inner", AnyDict("text", "deep")));
+    value = value.asDict()["inner"];
+    EXPECT_EQ(value, Any(AnyDict("text", "deep")));
+    value = std::move(value.asDict()["text"]);
+    EXPECT_EQ(value, "deep");
+    value = value.asString() + 2;
+    EXPECT_EQ(value, "ep");
+    Any list(AnyVector(AnyVector(1, 2), 3));
+    list = list.asVector()[0];
+    EXPECT_EQ(list, Any(AnyVector(1, 2)));
+}
+
+TEST(Any, containersAndObjectsKeepTheirAddressWhileTheTypeStays) {
+    Any dict(AnyDict("a", 1));
+    const AnyDict* address = dict;
+    dict = AnyDict("b", 2);
+    dict = Any(AnyDict("c", 3));
+    EXPECT_EQ(static_cast<AnyDict*>(dict), address);
+    EXPECT_EQ(address->get("c"), 3);
+
+    Any point(QvPoint(1, 2));
+    const QvPoint* held = &point.asPoint();
+    point = Any(QvPoint(3, 4));
+    EXPECT_EQ(&point.asPoint(), held);
+    EXPECT_EQ(held->y(), 4);
+}
+
+TEST(Any, sharedNullRefusesEveryKindOfAssignment) {
+    Any& null = Any::null();
+    EXPECT_TRUE(null.isNull());
+    EXPECT_FALSE(null.isValid());
+    EXPECT_EQ(&null, &Any::invalid());
+    for (const Any& value : oneOfEach())
+        EXPECT_EQ(failureOf([&] { null = value; }), nullAssignment) << Any::typeName(value.type());
+    EXPECT_EQ(failureOf([&] { null = 1; }), nullAssignment);
+    EXPECT_EQ(failureOf([&] { null.set("x"); }), nullAssignment);
+    EXPECT_EQ(failureOf([&] { null.set(noBytes, 4); }), nullAssignment);
+    EXPECT_EQ(failureOf([&] { null.invalidate(); }), nullAssignment);
+    EXPECT_EQ(failureOf([&] { null = null; }), "no failure");
+
+    const Any copy = null;
+    EXPECT_FALSE(copy.isNull());
+    Any moved = std::move(null);
+    EXPECT_FALSE(moved.isNull());
+    EXPECT_TRUE(Any::null().isNull());
+    EXPECT_NE(null, Any());
+    EXPECT_EQ(copy, Any());
+}
+
+TEST(Any, textLengthsAndPadding) {
+    Any text("abcdef", 3);
+    EXPECT_EQ(text, "abc");
+    EXPECT_EQ(text.size(), 3);
+
+    const char* buffer = text.asString();
+    text = "xy";
+    EXPECT_EQ(text.asString(), buffer);
+    EXPECT_EQ(text.size(), 2);
+
+    text.set("ab", 5);
+    EXPECT_EQ(text.size(), 5);
+    EXPECT_EQ(std::string(text.asString(), 6), std::string("ab\0\0\0\0", 6));
+    EXPECT_EQ(Any(text).size(), 2);
+    EXPECT_EQ(Any(std::move(text)).size(), 2);
+
+    EXPECT_EQ(failureOf([] { Any(static_cast<const char*>(nullptr)); }), "");
+    EXPECT_EQ(failureOf([] { Any("x", -1); }), "");
+}
+
+TEST(Any, wideTextIsMeasuredUpTo65536Units) {
+    const std::vector<unsigned short> units(70000, 'w');
+    const Any given(units.data(), 70000);
+    EXPECT_EQ(given.size(), 70000);
+    EXPECT_EQ(Any(given).size(), 65536);
+    Any source = given;
+    source.set(units.data(), 70000);
+    const Any moved = std::move(source);
+    EXPECT_EQ(moved.size(), 65536);
+    EXPECT_EQ(moved.asWString()[65536], 0);
+}
+
+TEST(Any, genericOwnsBytesOrBorrowsAPointer) {
+    char bytes[] = "abcd";
+    Any owned(bytes, 4);
+    EXPECT_NE(owned.asGeneric(), bytes);
+    bytes[0] = 'X';
+    EXPECT_EQ(std::string(static_cast<char*>(owned.asGeneric()), 4), "abcd");
+    EXPECT_NE(Any(owned).asGeneric(), owned.asGeneric());
+    owned.set(noBytes, 4);
+    EXPECT_EQ(owned, Any(static_cast<const void*>("\0\0\0\0"), 4));
+
+    const Any borrowed(static_cast<const void*>(bytes));
+    EXPECT_EQ(borrowed.size(), 0);
+    EXPECT_EQ(Any(borrowed).asGeneric(), bytes);
+    EXPECT_EQ(borrowed, Any(static_cast<const void*>(bytes)));
+    EXPECT_NE(borrowed, Any(static_cast<const void*>(bytes + 1)));
+    EXPECT_EQ(failureOf([&] { Any(static_cast<const void*>(bytes), -4); }), "");
+}
+
+TEST(Any, numbersIntoOneAnother) {
+    struct Case {
+        Any value;
+        int as32;
+        long long as64;
+        double asDouble;
+    };
+    const Case cases[] = {
+        {Any(-7), -7, -7, -7.0},
+        {Any(0x1'0000'0002LL), 2, 0x1'0000'0002LL, 4294967298.0},
+        {Any(1.5), 1, 1, 1.5},
+        {Any(-1.5), -1, -1, -1.5},
+        {Any(1e30), highestInt, std::numeric_limits<long long>::max(), 1e30},
+        {Any(-1e30), lowestInt, std::numeric_limits<long long>::min(), -1e30},
+        {Any(2147483648.0), highestInt, 2147483648LL, 2147483648.0},
+        {Any(0.25f), 0, 0, 0.25},
+    };
+    for (const Case& c : cases) {
+        EXPECT_EQ(c.value.toInt32(), c.as32) << c.asDouble;
+        EXPECT_EQ(c.value.toInt64(), c.as64) << c.asDouble;
+        EXPECT_EQ(c.value.toFloat(), c.asDouble);
+    }
+    EXPECT_EQ(Any(nan).toInt32(), 0);
+    EXPECT_EQ(Any(nan).toInt64(), 0);
+    for (const Any& value : oneOfEach()) {
+        if (value.isInt() || value.isFloat()) continue;
+        EXPECT_EQ(failureOf([&] { value.toInt32(); }), "") << Any::typeName(value.type());
+        EXPECT_EQ(failureOf([&] { value.toInt64(); }), "") << Any::typeName(value.type());
+        EXPECT_EQ(failureOf([&] { value.toDouble(); }), "") << Any::typeName(value.type());
+    }
+}
+
+TEST(Any, readsOfAnotherTypeNeverReachForeignMemory) {
+    for (const Any& value : oneOfEach()) {
+        if (value.isGeneric()) continue;
+        SCOPED_TRACE(Any::typeName(value.type()));
+        EXPECT_EQ(value.asString() != nullptr, value.isText());
+        EXPECT_EQ(value.asWString() != nullptr, value.isWString());
+        EXPECT_EQ(value.asDict().isNull(), !value.isDict());
+        EXPECT_EQ(value.asVector().isNull(), !value.isVector());
+        EXPECT_EQ(static_cast<AnyDict*>(value) != nullptr, value.isDict());
+        EXPECT_EQ(failureOf([&] { value.asRect(); }), value.isRect() ? "no failure" : "");
+        EXPECT_EQ(failureOf([&] { value.asMediaTime(); }), value.isMediaTime() ? "no failure" : "");
+    }
+    EXPECT_EQ(Any(1.0).asInt64(), 0x3FF0'0000'0000'0000LL);
+    EXPECT_EQ(Any(5).asInt32(9), 5);
+    EXPECT_EQ(Any(5).asInt64(9), 9);
+    EXPECT_EQ(Any(5).asFloat(9.0), 9.0);
+    EXPECT_STREQ(Any(u"x").asString("other"), "other");
+}
+
+TEST(Any, truth) {
+    int something = 0;
+    const Any yes[] = {Any(-1),         Any(1LL << 40),  Any(nan),
+                       Any("0"),        Any(u"0"),       Any(AnyDict("a", Any())),
+                       AnyVector(0, 0), Any(noBytes, 1), Any(static_cast<const void*>(&something))};
+    const Any no[] = {Any(),
+                      Any(0),
+                      Any(0LL),
+                      Any(-0.0),
+                      Any(""),
+                      Any(u""),
+                      Any(AnyDict()),
+                      Any(AnyVector()),
+                      Any(Pair(1, 1)),
+                      Any(QvFramerate()),
+                      Any(static_cast<const void*>(nullptr))};
+    for (const Any& value : yes) EXPECT_TRUE(value && value.isTrue() && !value.isFalse()) << value.type();
+    for (const Any& value : no) EXPECT_TRUE(!value && !value.isTrue() && value.isFalse()) << value.type();
+}
+
+TEST(Any, equalityNeedsTypeSizeAndValue) {
+    const auto values = oneOfEach();
+    for (std::size_t i = 0; i < values.size(); ++i)
+        for (std::size_t j = 0; j < values.size(); ++j) EXPECT_EQ(values[i] == values[j], i == j) << i << j;
+
+    EXPECT_NE(Any(1), Any(1LL));
+    EXPECT_NE(Any(1), Any(1.0));
+    EXPECT_NE(Any(nan), Any(nan));
+    EXPECT_EQ(Any(0.0), Any(-0.0));
+    EXPECT_NE(Any("ab"), Any("abc"));
+    EXPECT_NE(Any(static_cast<const void*>("ab"), 2), Any(static_cast<const void*>("ac"), 2));
+    EXPECT_NE(Any(MediaTime(1, 25)), Any(MediaTime(2, 50)));
+
+    const unsigned short wide[] = {'a', 0};
+    EXPECT_TRUE(Any("a") == "a" && "a" == Any("a") && Any("a") != "b" && Any("a") != "ab");
+    EXPECT_TRUE(Any(u"a") == wide && wide == Any(u"a") && Any(u"b") != wide && Any(u"aa") != wide);
+    EXPECT_TRUE(Any(u"a") != "a" && Any("a") != wide && Any(1) != "1");
+    EXPECT_TRUE(Any(1) == 1 && 1 == Any(1) && Any(1) != 1LL && Any(1.0) != 1 && Any("1") != 1);
+}
+
+TEST(Any, orderGoesByTypeOnlyForLess) {
+    const auto values = oneOfEach();
+    for (const Any& a : values)
+        for (const Any& b : values) {
+            if (a.type() == b.type()) continue;
+            EXPECT_EQ(a < b, a.type() < b.type());
+            EXPECT_FALSE(a > b);
+        }
+    EXPECT_TRUE(Any(-1) < Any(1) && Any(1) > Any(-1) && !(Any(1) < Any(1)));
+    EXPECT_TRUE(Any("a") < Any("ab") && Any("z") < Any("\xC3\xA4") && Any("b") > Any("ab"));
+    EXPECT_TRUE(Any(u"\u00FF") < Any(u"\u0100") && Any(u"\uFFFF") > Any(u"a"));
+    EXPECT_FALSE(Any(Pair(1, 1)) < Any(Pair(2, 2)) || Any(Pair(2, 2)) > Any(Pair(1, 1)));
+}
+
+TEST(Any, narrowAndWide) {
+    EXPECT_EQ(Any("a\xC3\xA9\xF0\x9F\x8E\xAC").toWString(), Any(u"a\u00e9\U0001F3AC"));
+    EXPECT_EQ(Any(u"a\u00e9\U0001F3AC").toString(), "a\xC3\xA9\xF0\x9F\x8E\xAC");
+    EXPECT_EQ(Any("").toWString(), Any(u""));
+    for (const char* odd : {"\xFF", "a\xC3", "\xED\xA0\x80x", "\xC0\xAF"})
+        EXPECT_EQ(Any(odd).toWString().toString(), odd);
+    EXPECT_EQ(Any(1).toString(), Any());
+    EXPECT_FALSE(Any::null().toWString().isNull());
+}
+
+TEST(Any, substr) {
+    struct Case {
+        int start, end;
+        const char* result;  // null: out of range
+    };
+    const Case cases[] = {{1, -1, "ello"}, {-2, -1, "lo"},   {0, 5, "hello"},
+                          {0, 1, "h"},     {-5, -5, "h"},    {2, 2, nullptr},
+                          {3, 1, nullptr}, {0, 6, nullptr},  {-6, 3, nullptr},
+                          {5, 5, nullptr}, {0, -7, nullptr}, {lowestInt, highestInt, nullptr}};
+    for (const Case& c : cases) {
+        SCOPED_TRACE(std::to_string(c.start) + " to " + std::to_string(c.end));
+        for (const Any& text : {Any("hello"), Any(u"hello")}) {
+            Any part;
+            const auto failure = failureOf([&] { part = text.substr(c.start, c.end); });
+            if (c.result) {
+                EXPECT_EQ(part.toString(), c.result);
+                EXPECT_EQ(part.type(), text.type());
+            } else {
+                EXPECT_EQ(failure, "Any.substr: index out of range");
+            }
+        }
+    }
+    EXPECT_EQ(Any("").substr(0, 5), "");
+    EXPECT_EQ(Any(u"").substr(3, 2), Any(u""));
+    EXPECT_EQ(failureOf([] { Any(1).substr(0, 1); }), "Any.substr: invalid type");
+}
+
+TEST(Any, replace) {
+    const auto many = [](const char* text, int count) {
+        std::string result;
+        while (count-- > 0) result += text;
+        return result;
+    };
+    struct Case {
+        std::string text, find, with, result;
+    };
+    const Case cases[] = {
+        {"a.b.c", ".", "::", "a::b::c"},
+        {"aaa", "aa", "b", "ba"},
+        {"xaab", "ab", "b", "xb"},  // each step makes the next occurrence
+        {"ab ab", "ab", "ab", "ab ab"},
+        {"abc", "x", "yyy", "abc"},
+        {"baab", "ba", "ab", "aabb"},
+        {"", "x", "y", ""},
+        {"abc", "", "", "abc"},
+        {"xay", "a", "ab", ("xa" + many("b", 5000)).substr(0, 4095)},
+        {"xay", "a", "ba", "x" + many("b", 4094)},
+        {"q", "", "12", many("12", 2048).substr(0, 4095)},
+        {many("a", 5000), "a", "bb", many("b", 4095)},
+        {many("ab", 9000), "b", "", many("a", 4095)},
+        {many("a", 9000) + "b", "aaa", "", "b"},
+        {many("a", 40) + "b", "ab", "bba", many("b", 4095)},  // doubles with each "a"
+    };
+    for (const Case& c : cases) {
+        const Any narrow = Any(c.text.c_str()).replace(c.find.c_str(), c.with.c_str());
+        EXPECT_EQ(narrow, c.result.c_str()) << c.text.substr(0, 20) << ' ' << c.find;
+        const Any wide =
+            Any(c.text.c_str()).toWString().replace(Any(c.find.c_str()).toWString(), c.with.c_str());
+        EXPECT_EQ(wide, Any(c.result.c_str()).toWString()) << c.text.substr(0, 20) << ' ' << c.find;
+    }
+    EXPECT_EQ(Any("\xE4-").replace(Any(u"-"), "\xC3\xA9"), Any(u"\u00e4\u00e9"));
+    EXPECT_EQ(failureOf([] { Any("1").replace(Any(1), "2"); }), "");
+}
+
+TEST(Any, strcatAndSprintf) {
+    EXPECT_EQ(Any::strcat("ab", "cd"), "abcd");
+    EXPECT_EQ(Any::strcat("ab", Any(u"cd")), Any(u"abcd"));
+    EXPECT_EQ(Any::strcat(Any(1), "x"), Any(u"x"));
+    EXPECT_EQ(Any::strcat(Any(), Any()), Any(u""));
+
+    const std::string longText(3000, 'x');
+    EXPECT_EQ(Any::sprintf("%s", longText.c_str()).size(), 2047);
+    EXPECT_EQ(Any::sprintf("%d/%s", 7, "a"), "7/a");
+}
+
+TEST(Any, sprintfIgnoresTheLocale) {
+    const std::string before = std::setlocale(LC_ALL, nullptr);
+    bool comma = false;
+    for (const char* name : {"de_DE.UTF-8", "de_DE", "fr_FR.UTF-8", "es_ES.UTF-8"})
+        if (std::setlocale(LC_ALL, name)) comma = true;
+    const Any text = Any::sprintf("%.2f", 1.5);
+    std::setlocale(LC_ALL, before.c_str());
+    EXPECT_EQ(text, "1.50");
+    if (!comma) GTEST_SKIP() << "no locale with a decimal comma is installed";
+}
+
+}  // namespace

@@ -1,0 +1,71 @@
+#include "core/value/utf.h"
+
+#include <gtest/gtest.h>
+
+namespace {
+
+std::vector<unsigned short> units(const char16_t* text) {
+    const std::u16string_view view(text);
+    return {view.begin(), view.end()};
+}
+
+TEST(Utf, illFormedUtf8BecomesReplacementCharacters) {
+    struct Case {
+        const char* bytes;
+        const char16_t* units;
+        bool valid;
+    };
+    const Case cases[] = {
+        {"", u"", true},
+        {"az\x7F", u"az\x7F", true},
+        {"\xC2\x80\xDF\xBF", u"\u0080\u07FF", true},
+        {"\xE0\xA0\x80\xED\x9F\xBF\xEE\x80\x80\xEF\xBF\xBF", u"\u0800\uD7FF\uE000\uFFFF", true},
+        {"\xF0\x90\x80\x80\xF4\x8F\xBF\xBF", u"\U00010000\U0010FFFF", true},
+        {"\x80", u"\uFFFD", false},
+        {"a\xC3", u"a\uFFFD", false},
+        {"\xC3(", u"\uFFFD(", false},
+        {"\xE2\x82"
+         "a",
+         u"\uFFFD"
+         u"a",
+         false},  // a truncated sequence counts once
+        {"\xF0\x9F\x8E", u"\uFFFD", false},
+        {"\xC0\xAF", u"\uFFFD\uFFFD", false},            // overlong
+        {"\xE0\x80\xAF", u"\uFFFD\uFFFD\uFFFD", false},  // overlong
+        {"\xED\xA0\x80", u"\uFFFD\uFFFD\uFFFD", false},  // a surrogate
+        {"\xF4\x90\x80\x80", u"\uFFFD\uFFFD\uFFFD\uFFFD", false},
+        {"\xFE\xFF", u"\uFFFD\uFFFD", false},
+    };
+    for (const Case& c : cases) {
+        EXPECT_EQ(QvUtf::toUtf16(c.bytes), units(c.units)) << testing::PrintToString(c.bytes);
+        EXPECT_EQ(QvUtf::isValid(c.bytes), c.valid) << testing::PrintToString(c.bytes);
+        if (c.valid) {
+            EXPECT_EQ(QvUtf::toUtf8(units(c.units)), c.bytes);
+        }
+    }
+}
+
+TEST(Utf, unpairedSurrogatesBecomeReplacementCharacters) {
+    const unsigned short high = 0xD83C, low = 0xDFAC;
+    const std::string bad = "\xEF\xBF\xBD";
+    EXPECT_EQ(QvUtf::toUtf8(std::vector{high, low}), "\xF0\x9F\x8E\xAC");
+    EXPECT_EQ(QvUtf::toUtf8(std::vector{low, high}), bad + bad);
+    EXPECT_EQ(QvUtf::toUtf8(std::vector{high, high, low}), bad + "\xF0\x9F\x8E\xAC");
+    EXPECT_EQ(QvUtf::toUtf8(std::vector{high}), bad);
+}
+
+TEST(Utf, everyScalarValueSurvivesTheRoundTrip) {
+    for (char32_t c = 0; c <= 0x10FFFF; c += c < 0x3000 ? 1 : 37) {
+        if (c >= 0xD800 && c < 0xE000) continue;
+        std::string bytes;
+        QvUtf::append(bytes, c);
+        ASSERT_TRUE(QvUtf::isValid(bytes)) << static_cast<unsigned>(c);
+        ASSERT_EQ(QvUtf::toUtf8(QvUtf::toUtf16(bytes)), bytes) << static_cast<unsigned>(c);
+    }
+    std::string bytes;
+    QvUtf::append(bytes, 0xD800);
+    QvUtf::append(bytes, 0x110000);
+    EXPECT_EQ(bytes, "\xEF\xBF\xBD\xEF\xBF\xBD");
+}
+
+}  // namespace
