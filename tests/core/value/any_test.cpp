@@ -326,7 +326,7 @@ TEST(Any, replace) {
         {"", "x", "y", ""},
         {"abc", "", "", "abc"},
         {"xay", "a", "ab", ("xa" + many("b", 5000)).substr(0, 4095)},
-        {"xay", "a", "ba", "x" + many("b", 4094)},
+        {"xay", "a", "ba", std::string("x") + many("b", 4094)},
         {"q", "", "12", many("12", 2048).substr(0, 4095)},
         {many("a", 5000), "a", "bb", many("b", 4095)},
         {many("ab", 9000), "b", "", many("a", 4095)},

@@ -203,7 +203,8 @@ TEST(AnyDict, behavesAsAMapUnderRandomUse) {
     std::map<std::string, int> model;
     AnyDict dict;
     for (int i = 0; i < 20000; ++i) {
-        std::string key = "key_" + std::string(random() % 3, '_') + std::to_string(random() % 300);
+        std::string key =
+            std::string("key_") + std::string(random() % 3, '_') + std::to_string(random() % 300);
         if (random() % 3 == 0) {
             model.erase(key);
             dict.remove(key.c_str());
