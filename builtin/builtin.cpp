@@ -20,7 +20,7 @@ constexpr QvBuiltinRow registered[] = {
      {.internal = true}},
     {"scaler",       videoFilter,  "Scaler/Color converter",         "Scaler/Color Converter",     nullptr},
     {"vprocess",     videoPipe,    "Video processing pipe",          "Video pipe",                 newVprocess},
-    {"encpipe",      encodePipe,   "Default exporter",               "Default exporter",           nullptr},
+    {"encpipe",      encodePipe,   "Default exporter",               "Default exporter",           newEncpipe},
     {"dummyaenc",    audioEncoder, "Pass through audio",             "DV Audio",                   newDummyaenc},
     {"rawdec",       decoder,      "Raw video file reader",          "Raw file import",            newRawdec,
      {.exts = "raw rgb yuv i420 yv12 yuy2 yuyv bgr4 bgr3 bgra rgb3 rgb4 argb v210", .priority = 10,

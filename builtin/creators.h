@@ -19,3 +19,4 @@ QvCodec* newMemmux();
 QvCodec* newMemsink();
 QvCodec* newVprocess();
 QvCodec* newAprocess();
+QvCodec* newEncpipe();
