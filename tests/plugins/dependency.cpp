@@ -1,0 +1,2 @@
+// A library that needy_plugin needs.
+const char* qvTestDependencyName() { return "needy from its own folder"; }

@@ -1,0 +1,8 @@
+#include "core/engine/qvplugin.h"
+
+const char* qvTestDependencyName();
+
+extern "C" QV_API QvPlugin* plugin_init() {
+    static QvPlugin plugin("needy", qvTestDependencyName());
+    return &plugin;
+}

@@ -1,0 +1,11 @@
+#include "core/engine/qvplugin.h"
+
+namespace {
+
+struct OwnType {
+    const char* text;
+};
+
+}  // namespace
+
+extern "C" QV_API QvPlugin* plugin_init() { throw OwnType{"of a type that only this library knows"}; }
