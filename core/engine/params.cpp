@@ -146,9 +146,10 @@ bool convert(const Any& from, QvFramerate& to) {
         to = from.asFramerate();
         return true;
     }
-    if (!isNumber(from)) return false;
-    const QvFramerate rate(from.toDouble());
-    if (!(rate.rate() > 0)) return false;  // no fraction comes near, or no rate at all
+    double perSecond = 0;
+    if (!convert(from, perSecond) || !(perSecond > 0) || !std::isfinite(perSecond)) return false;
+    const QvFramerate rate(perSecond);
+    if (rate.rate().num <= 0) return false;  // no fraction comes near
     to = rate;
     return true;
 }

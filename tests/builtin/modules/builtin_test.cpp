@@ -58,7 +58,7 @@ TEST_F(Builtin, DecodersAreFoundByExtension) {
     };
     for (const auto& c : cases) EXPECT_EQ(decodersFor(c.ext), c.decoders) << c.ext;
     const std::unique_ptr<AnyVector> patterns(registry.inputExts(true, true));
-    EXPECT_EQ(patterns->size(), 23);
+    EXPECT_EQ(patterns->size(), 22);
     EXPECT_GE(patterns->indexOf(Any("*.wav")), 0);
     EXPECT_EQ(patterns->indexOf(Any("*.wav"), patterns->indexOf(Any("*.wav"))), -1);
 }

@@ -100,6 +100,8 @@ TEST(Params, NumbersAreCheckedAtTheDoor) {
         {"rate", Any(-25.0), false},
         {"rate", Any(std::nan("")), false},
         {"rate", Any(infinity), false},
+        {"rate", Any(1e300), false},
+        {"rate", Any(1e-9), false},
         {"rate", Any(QvFramerate(50.0)), true},
         {"extra", Any(AnyDict("a", 1)), true},
         {"extra", Any(1), false},
