@@ -39,14 +39,13 @@ int setInterlaced(Settings& settings, const Any& value) {
     return QvStatus::ok;
 }
 
-constexpr double anyInt = std::numeric_limits<int>::max();
 constexpr double anyOffset = 9.0e18;
 // How the width, the height and the rate are answered: as parameters of the stream only.
 constexpr unsigned ofStream = qvParamWriteOnly;
 
 const QvParamRow<Settings> rows[] = {
-    {"width", &Settings::width, ofStream, 0, anyInt, "pixels"},
-    {"height", &Settings::height, ofStream, 0, anyInt, "rows"},
+    {"width", &Settings::width, ofStream},
+    {"height", &Settings::height, ofStream},
     {"framerate", QvParamAccess<Settings>{setFramerate, nullptr}},
     {"frameAspect", &Settings::frameAspect, ofStream, 0, 1e6, "of the picture, 0 for square pixels"},
     {"invert", &Settings::invert, qvParamPlain, 0, 1, "rows are bottom first"},

@@ -260,6 +260,7 @@ void drawViewNr(QvFrame& frame, int viewNr, CardText* text) {
 
 void clear(QvFrame& frame) {
     QV_ASSERT_MSG(frame.isRGB(), "testgen: only RGB supported");
+    frame.setBlack();  // the fourth bytes, too
     frame.setRGB(128, 128, 128);
 }
 

@@ -50,12 +50,12 @@ WavStream::WavStream(InputFile file, const WavHeader& header) : header_(header),
 
 int WavStream::read(int count) {
     const long long left = header_.samples - pcm->position();
-    const int most = std::numeric_limits<int>::max() / header_.frameBytes();  // a buffer has 31 bits of bytes
-    count = static_cast<int>(std::min<long long>({count, left, most}));
-    if (count <= 0) {
+    if (count <= 0 || left <= 0) {
         pcm->setSamples(0);
         return QvStatus::endOfStream;
     }
+    const int most = std::numeric_limits<int>::max() / header_.frameBytes();  // a buffer has 31 bits of bytes
+    count = static_cast<int>(std::min<long long>({count, left, most}));
     if (count > pcm->size() && pcm->grow(count - pcm->size()) < 0) return QvStatus::outOfMemory;
     const auto channels = static_cast<std::size_t>(header_.channels);
     const auto values = static_cast<std::size_t>(count) * channels;

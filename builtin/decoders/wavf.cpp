@@ -47,6 +47,7 @@ class HeaderReader {
     long long formatFieldsEnd_ = 0;
     long long formatEnd_ = 0;
     int subFormat_ = 0;
+    int blockAlign_ = 0;
     std::uint32_t dataSize_ = 0;
 
     bool isRf64() const { return riff_.id == "RF64" || riff_.id == "BW64"; }
@@ -126,6 +127,7 @@ bool HeaderReader::readFormat(long long position, std::uint32_t size) {
     header_.formatTag = static_cast<int>(u16(bytes));
     header_.channels = static_cast<int>(u16(bytes + 2));
     header_.samplerate = static_cast<int>(u32(bytes + 4));
+    blockAlign_ = static_cast<int>(u16(bytes + 12));
     header_.bitsPerSample = static_cast<int>(u16(bytes + 14));
     if (header_.formatTag == 1 || size < sizeof bytes) return true;
     if (!bytesAt(position, bytes, sizeof bytes)) return false;
@@ -174,7 +176,9 @@ WavStatus HeaderReader::checkFormat() const {
         header_.bitsPerSample == 8 || header_.bitsPerSample == 16 || header_.bitsPerSample == 24;
     if (!width || header_.channels < 1 || header_.channels > 8 || header_.samplerate < 1)
         return WavStatus::badFormat;
-    return WavStatus::ok;
+    // Values in wider containers, as 24 bits in four bytes; read as packed they would be noise.
+    const bool padded = blockAlign_ > header_.frameBytes() && blockAlign_ % header_.channels == 0;
+    return padded ? WavStatus::badFormat : WavStatus::ok;
 }
 
 // Whole chunks from here to the end of the file: then an empty "data" chunk is meant as it stands.

@@ -1,0 +1,237 @@
+#include "builtin/decoders/rawdec.h"
+
+#include <gtest/gtest.h>
+
+#include <string>
+
+#include "core/engine/init.h"
+#include "core/engine/qvexception.h"
+#include "core/engine/qvregistry.h"
+#include "tests/support/temp_folder.h"
+#include "tests/support/wav_bytes.h"
+
+namespace {
+
+class Raw : public testing::Test {
+  protected:
+    Raw() {
+        init_wrapper(nullptr);
+        decoder.init();
+    }
+    ~Raw() override {
+        decoder.close();
+        cleanup_wrapper();
+    }
+
+    void set(const char* fourcc, int width, int height) {
+        EXPECT_EQ(decoder.setParam("width", width), 0);
+        EXPECT_EQ(decoder.setParam("height", height), 0);
+        EXPECT_EQ(decoder.setParam("FOURCC", fourcc), 0);
+    }
+    int open(const std::string& bytes) {
+        decoder.setParam("filename", folder.write("a.raw", bytes).c_str());
+        return decoder.open();
+    }
+    std::string plane(int nr = 0) {
+        const QvFrame& frame = *decoder.getFramePtr(0);
+        return {reinterpret_cast<const char*>(frame.plane(nr)),
+                static_cast<std::size_t>(frame.plane_bytes(nr))};
+    }
+    std::string picture() {
+        std::string all;
+        for (int nr = 0; nr < decoder.getFramePtr(0)->planes(); ++nr) all += plane(nr);
+        return all;
+    }
+
+    TempFolder folder;
+    RawDecoder decoder;
+};
+
+TEST_F(Raw, FramesComeInOrderAndAfterSeeks) {
+    set("I420", 6, 4);
+    constexpr std::size_t frameBytes = 36;
+    const std::string bytes = patternBytes(5 * frameBytes);
+    ASSERT_EQ(open(bytes), 0);
+    EXPECT_EQ(decoder.nrFrames(0), 5);
+    for (int i = 0; i < 5; ++i) {
+        ASSERT_EQ(decoder.readFrame(0), 0);
+        EXPECT_EQ(decoder.getFramePtr(0)->frameNr, i);
+        EXPECT_EQ(picture(), bytes.substr(static_cast<std::size_t>(i) * frameBytes, frameBytes));
+    }
+    EXPECT_EQ(decoder.readFrame(0), -4);
+    for (const int i : {3, 0, 4}) {
+        ASSERT_EQ(decoder.seekToFrame(i, 0), 0);
+        ASSERT_EQ(decoder.readFrame(0), 0);
+        EXPECT_EQ(decoder.getFramePtr(0)->frameNr, i);
+        EXPECT_EQ(picture(), bytes.substr(static_cast<std::size_t>(i) * frameBytes, frameBytes));
+    }
+    for (const long long bad : {-1LL, 5LL, 1LL << 60}) {
+        EXPECT_EQ(decoder.seekToFrame(bad, 0), -1);
+        EXPECT_STREQ(decoder.errorDesc(), "Invalid seek pos");
+    }
+    EXPECT_EQ(decoder.readFrame(1), -1);
+    EXPECT_STREQ(decoder.errorDesc(), "Invalid stream nr");
+    decoder.close();
+    EXPECT_EQ(decoder.readFrame(0), -1);
+    EXPECT_STREQ(decoder.errorDesc(), "stream not opened");
+}
+
+TEST_F(Raw, PartsOfFramesAreToldAndNeverRead) {
+    set("GRAY", 8, 2);
+    const struct {
+        std::size_t bytes;
+        long long offset;
+        int frames;
+        bool truncated;
+    } cases[] = {{0, 0, 0, false},  {15, 0, 0, true}, {16, 0, 1, false},  {40, 0, 2, true},
+                 {40, 8, 2, false}, {40, 9, 1, true}, {40, 40, 0, false}, {40, 100, 0, false}};
+    for (const auto& c : cases) {
+        decoder.setParam("offset", c.offset);
+        ASSERT_EQ(open(patternBytes(c.bytes)), 0);
+        EXPECT_EQ(decoder.nrFrames(0), c.frames) << c.bytes;
+        EXPECT_EQ(decoder.getVideoParam(0, "truncated") == Any(1), c.truncated) << c.bytes << " " << c.offset;
+        EXPECT_TRUE(decoder.getVideoParam(0, "framesExpected") ==
+                    (c.truncated ? Any(c.frames + 1LL) : Any()));
+        for (int i = 0; i < c.frames; ++i) EXPECT_EQ(decoder.readFrame(0), 0);
+        EXPECT_EQ(decoder.readFrame(0), -4);
+        EXPECT_EQ(decoder.getParam("framesFloat").toDouble() * 16,
+                  static_cast<double>(std::max(0LL, static_cast<long long>(c.bytes) - c.offset)));
+    }
+}
+
+TEST_F(Raw, DescribesItsStream) {
+    set("I420", 720, 576);
+    decoder.setParam("framerate", QvFramerate(25.0, 1));
+    decoder.setParam("frameAspect", 16.0 / 9);
+    const std::string bytes = patternBytes(3 * 720 * 576 * 3 / 2);
+    ASSERT_EQ(open(bytes), 0);
+    const auto number = [this](const char* name) { return decoder.getVideoParam(0, name).toDouble(); };
+    EXPECT_EQ(decoder.getParam("video0/width").toInt32(), 720);
+    EXPECT_EQ(number("height"), 576);
+    EXPECT_EQ(static_cast<unsigned>(number("FOURCC")), QvFourcc::I420);
+    EXPECT_EQ(number("frames"), 3);
+    EXPECT_DOUBLE_EQ(number("duration"), 3 / 25.0);
+    EXPECT_DOUBLE_EQ(number("pixelAspect"), 16.0 / 9 * 576 / 720);
+    EXPECT_EQ(number("pal"), 1);
+    EXPECT_TRUE(decoder.getVideoParam(0, "framerate") == Any(QvFramerate(25.0, 1)));
+    EXPECT_EQ(decoder.getParam("filesize").toInt64(), static_cast<long long>(bytes.size()));
+    EXPECT_EQ(decoder.getParam("topFirst").toInt32(), 1);
+    EXPECT_EQ(decoder.getParam("notSeekable").toInt32(), 0);
+    EXPECT_TRUE(decoder.getParam("extendedFOURCC") == "I420");
+    ASSERT_EQ(decoder.readFrame(0), 0);
+    EXPECT_EQ(decoder.getFramePtr(0)->framerate.interlaced(), 1);
+}
+
+TEST_F(Raw, InvertedFilesBeginAtTheBottom) {
+    set("I420", 2, 4);
+    decoder.setParam("invert", 1);
+    ASSERT_EQ(open("aabbccddUVuv"), 0);
+    ASSERT_EQ(decoder.readFrame(0), 0);
+    EXPECT_EQ(plane(0), "ddccbbaa");
+    EXPECT_EQ(plane(1), "VU");
+    EXPECT_EQ(plane(2), "vu");
+}
+
+TEST_F(Raw, PackedFormatsBecomeBgr3) {
+    set("BGRU", 2, 2);  // rows of 6 bytes in the file, of 8 in the frame
+    ASSERT_EQ(open("abcdefghijkl"), 0);
+    EXPECT_EQ(decoder.nrFrames(0), 1);
+    ASSERT_EQ(decoder.readFrame(0), 0);
+    EXPECT_EQ(plane().substr(0, 6) + plane().substr(8, 6), "abcdefghijkl");
+    EXPECT_EQ(decoder.getFramePtr(0)->four_cc(), QvFourcc::BGR3);
+
+    set("BGR6", 4, 1);  // the high byte is the second one
+    ASSERT_EQ(open("-a-b-c-d-e-f-g-h-i-j-k-l"), 0);
+    ASSERT_EQ(decoder.readFrame(0), 0);
+    EXPECT_EQ(plane(), "abcdefghijkl");
+}
+
+TEST_F(Raw, FieldsOneAfterTheOtherAreWoven) {
+    set("GRAY", 4, 4);
+    decoder.setParam("fieldOrderFile", 1);
+    const struct {
+        int flag;
+        const char* picture;
+    } cases[] = {{0, "aaaabbbbccccdddd"}, {1, "aaaaccccbbbbdddd"}, {2, "ccccaaaaddddbbbb"}};
+    for (const auto& c : cases) {
+        ASSERT_EQ(decoder.setParam("interlacedFlag", c.flag), 0);
+        ASSERT_EQ(open("aaaabbbbccccddddaaaabbbbccccdddd"), 0);
+        for (int i = 0; i < 2; ++i) {
+            ASSERT_EQ(decoder.readFrame(0), 0);
+            EXPECT_EQ(plane(), c.picture) << c.flag;
+            EXPECT_EQ(decoder.getFramePtr(0)->framerate.interlaced(), c.flag);
+        }
+    }
+    ASSERT_EQ(decoder.setParam("height", 3), 0);
+    EXPECT_EQ(decoder.open(), -1) << "an odd height has no two equal fields";
+}
+
+TEST_F(Raw, SizesAndFormatsThatCanNotBeAreRefused) {
+    folder.write("a.raw", "0123456789");
+    const struct {
+        int width;
+        int height;
+    } sizes[] = {{0, 240}, {-1, 240}, {320, 0}, {320, -1}, {100000, 100000}, {2147483647, 1}};
+    for (const auto& size : sizes) {
+        RawDecoder other;
+        other.init();
+        other.setParam("width", size.width);
+        other.setParam("height", size.height);
+        other.setParam("filename", folder.file("a.raw").c_str());
+        EXPECT_EQ(other.open(), -1) << size.width << "x" << size.height;
+        EXPECT_EQ(other.getState(), 2);
+    }
+    for (const Any& code : {Any("NONE"), Any("RG"), Any(7), Any(1.5)})
+        EXPECT_EQ(decoder.setParam("FOURCC", code), -5);
+    for (const Any& rate : {Any(0), Any(-25), Any("25"), Any(QvFramerate(0.0))})
+        EXPECT_EQ(decoder.setParam("framerate", rate), -5);
+    EXPECT_EQ(decoder.setParam("interlacedFlag", 3), -5);
+    EXPECT_EQ(decoder.setParam("offset", -1), -5);
+    EXPECT_THROW(decoder.setParam("colour", 1), QvParamException);
+
+    EXPECT_EQ(decoder.open(), -1);
+    EXPECT_STREQ(decoder.errorDesc(), "media dec: filename not set");
+    decoder.setParam("filename", folder.path().c_str());
+    EXPECT_EQ(decoder.open(), -1);
+    EXPECT_STREQ(decoder.errorDesc(), "Can not open file");
+}
+
+TEST_F(Raw, ChangesWhileOpenStartOver) {
+    set("GRAY", 4, 1);
+    ASSERT_EQ(open("aaaabbbbccccdddd"), 0);
+    ASSERT_EQ(decoder.readFrame(0), 0);
+    ASSERT_EQ(decoder.seekToFrame(2, 0), 0);
+    EXPECT_EQ(decoder.setParam("height", 2), 0);
+    EXPECT_EQ(decoder.nrFrames(0), 2);
+    ASSERT_EQ(decoder.readFrame(0), 0);
+    EXPECT_EQ(plane(), "aaaabbbb");
+    EXPECT_EQ(decoder.setParam("offset", 4), 0);
+    ASSERT_EQ(decoder.readFrame(0), 0);
+    EXPECT_EQ(plane(), "bbbbcccc");
+    EXPECT_EQ(decoder.setParam("filename", decoder.getParam("filename")), 0);
+    EXPECT_EQ(decoder.getState(), 3) << "the same name changes nothing";
+    EXPECT_EQ(decoder.setParam("filename", "other"), 0);
+    EXPECT_EQ(decoder.getState(), 2);
+}
+
+TEST_F(Raw, SettingsComeBackFromAStoredState) {
+    std::unique_ptr<QvCodec> first(qv_registry()->newCodec("rawdec"));
+    for (const auto& [name, value] : {std::pair<const char*, Any>{"FOURCC", Any("YUY2")},
+                                      {"width", Any(8)},
+                                      {"height", Any(2)},
+                                      {"offset", Any(3)},
+                                      {"invert", Any(1)},
+                                      {"framerate", Any(QvFramerate(29.97, 2))}})
+        ASSERT_EQ(first->setParam(name, value), 0);
+    AnyDict state;
+    first->store(state);
+    std::unique_ptr<QvCodec> second(qv_registry()->newCodec("rawdec"));
+    ASSERT_EQ(second->restore(state), 0);
+    AnyDict again;
+    second->store(again);
+    EXPECT_TRUE(state == again);
+    EXPECT_EQ(second->getParam("video0/width").toInt32(), 8);
+    EXPECT_EQ(second->getParam("interlacedFlag").toInt32(), 2);
+}
+
+}  // namespace

@@ -1,0 +1,118 @@
+#include "builtin/decoders/testcard.h"
+
+#include <gtest/gtest.h>
+
+#include <map>
+#include <string>
+#include <utility>
+
+#include "core/engine/qvexception.h"
+#include "core/media/qvbuffer.h"
+
+namespace {
+
+class Lines : public CardText {
+  public:
+    void draw(QvFrame&, int x, int y, const char* text) override { at[{x, y}] = text; }
+    std::map<std::pair<int, int>, std::string> at;
+};
+
+// 640 x 480: units of 40 columns and 30 rows, half a row unit is 15.
+class Card : public testing::Test {
+  protected:
+    Card() {
+        frame.init(QvFourcc::BGR4, 640, 480);
+        frame.framerate = QvFramerate(25.0);
+    }
+    unsigned pixel(int x, int y) const {
+        const unsigned char* p = frame.pixelPtr(x, y);
+        return static_cast<unsigned>(p[0] | p[1] << 8 | p[2] << 16);
+    }
+
+    QvFrame frame;
+    Lines lines;
+};
+
+TEST_F(Card, EveryPartIsInItsPlace) {
+    drawTestCard(frame, 4 / 3.0, &lines);
+    const struct {
+        const char* what;
+        int x;
+        int y;
+        unsigned colour;
+    } pixels[] = {
+        {"frame, top left", 0, 0, 0xFFFFFF},
+        {"frame, bottom right", 639, 479, 0xFFFFFF},
+        {"middle row", 300, 240, 0xFFFFFF},
+        {"middle column", 320, 200, 0xFFFFFF},
+        {"grid row", 300, 210, 0xAAAAAA},
+        {"grid column", 350, 215, 0xAAAAAA},
+        {"last grid column", 20, 445, 0xAAAAAA},
+        {"ground", 330, 215, 0x808080},
+        {"first second box", 15, 448, 0x303030},
+        {"its last column", 15 + 24 - 3, 477, 0x303030},
+        {"the last box", 15 + 24 * 24, 450, 0x303030},
+        {"field patch, first field", 640 - 135, 15, 0xFFFF00},
+        {"field patch, second row left", 640 - 135, 16, 0x808080},
+        {"field patch, second field", 640 - 135 + 60, 16, 0x00FFFF},
+        {"field patch, first row right", 640 - 135 + 60, 15, 0x808080},
+        {"format box", 15, 15, 0x800000},
+        {"white bar", 15, 90, 0xFFFFFF},
+        {"yellow bar", 55, 90, 0xFFFF00},
+        {"blue bar", 15 + 6 * 40, 209, 0x0000FF},
+        {"darkest gray", 20, 270, 0x000000},
+        {"lightest gray", 20 + 10 * 27, 359, 0xFFFFFF},
+        {"circle, right", 480 + 90, 240, 0xFFFFFF},
+        {"circle, top", 480, 150, 0xFFFFFF},
+    };
+    for (const auto& p : pixels) EXPECT_EQ(pixel(p.x, p.y), p.colour) << p.what;
+    EXPECT_EQ((lines.at[{19, 12}]), "640x480 25p ");
+    EXPECT_EQ((lines.at[{19, 42}]), "4:3 px.1:1 ");
+    EXPECT_EQ(lines.at.size(), 2u);
+}
+
+TEST_F(Card, MovingPartsFollowTheFrameNumber) {
+    drawTestCard(frame, 4 / 3.0, nullptr);
+    frame.frameNr = 25 * 60 + 3;
+    drawMovingParts(frame, 2, &lines);
+    const int begin = 3 * 24 + 16;  // a cell is 610 / 25 = 24.4 columns
+    EXPECT_EQ(pixel(begin + 1, 460), 0xFFFFFFu);
+    EXPECT_EQ(pixel(begin + 1, 448), 0x303030u) << "a row is left at the top";
+    EXPECT_EQ(pixel(begin + 30, 460), 0x303030u);
+    EXPECT_EQ(pixel(15, 386), 0x303030u) << "timecode box";
+    EXPECT_EQ((lines.at[{19, 383}]), "00:01:00:03");
+    EXPECT_EQ((lines.at[{19, 413}]), "#      1503");
+    EXPECT_EQ((lines.at[{490, 386}]), "view #2");
+}
+
+TEST_F(Card, NoCursorBeforeTheFirstFrame) {
+    drawTestCard(frame, 4 / 3.0, nullptr);
+    frame.frameNr = -1;
+    const QvFrame still = frame;
+    drawMovingParts(frame, 1, nullptr);
+    for (int x = 0; x < 640; ++x)
+        ASSERT_EQ(pixel(x, 460), *reinterpret_cast<const unsigned*>(still.pixelPtr(x, 460)) & 0xFFFFFF);
+}
+
+TEST_F(Card, FractionalRatesEndInANarrowBox) {
+    frame.framerate = QvFramerate(29.97);
+    drawTestCard(frame, 4 / 3.0, nullptr);
+    int boxes = 0;
+    bool inside = false;
+    for (int x = 15; x < 640 - 15; ++x) {
+        const bool dark = pixel(x, 460) == 0x303030;
+        if (dark && !inside) ++boxes;
+        inside = dark;
+    }
+    EXPECT_EQ(boxes, 29) << "the thirtieth begins where the last one ends";
+    EXPECT_EQ(pixel(15 + static_cast<int>(29 * 610 / 30.0) + 5, 460), 0x303030u);
+}
+
+TEST_F(Card, OtherFormatsAssert) {
+    for (const unsigned fourcc : {QvFourcc::I420, QvFourcc::BGR3}) {
+        frame.init(fourcc, 640, 480);
+        EXPECT_THROW(drawTestCard(frame, 4 / 3.0, nullptr), QvAssertFailure);
+    }
+}
+
+}  // namespace

@@ -1,0 +1,262 @@
+#include "builtin/decoders/testgenerator.h"
+
+#include <gtest/gtest.h>
+
+#include <cstring>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "core/decode/qvtestgenerator.h"
+#include "core/engine/init.h"
+#include "core/engine/qvexception.h"
+#include "core/engine/qvregistry.h"
+#include "core/media/qvbuffer.h"
+#include "core/media/qvsoundbytes.h"
+
+namespace {
+
+AnyDict videoDict(int width, int height, double rate, double seconds) {
+    return AnyDict("width", width, "height", height, "framerate", rate, "duration", seconds);
+}
+
+std::string pixels(const QvFrame& frame) {
+    return {reinterpret_cast<const char*>(frame.plane()), static_cast<std::size_t>(frame.plane_bytes(0))};
+}
+
+class Testgen : public testing::Test {
+  protected:
+    Testgen() {
+        init_wrapper(nullptr);
+        decoder.init();
+    }
+    ~Testgen() override {
+        decoder.close();
+        cleanup_wrapper();
+    }
+
+    int open(const AnyVector& vids, const AnyVector& auds) {
+        decoder.setParam("streams", AnyDict("vids", vids, "auds", auds));
+        return decoder.open();
+    }
+    int openVideo(const AnyDict& dict) { return open(AnyVector(Any(dict)), AnyVector()); }
+    int openAudio(double seconds) { return open(AnyVector(), AnyVector(Any(AnyDict("duration", seconds)))); }
+
+    GeneratorPipe decoder;
+};
+
+TEST_F(Testgen, MadeFromDescriptions) {
+    GeneratorVParams video;
+    video.duration = MediaTime(2.0);
+    video.framerate.set29p();
+    video.width = 320;
+    video.height = 240;
+    video.nrViews = 11;
+    GeneratorAParams audio;
+    audio.duration = MediaTime(1.5);
+    audio.samplerate = 8000;
+    std::unique_ptr<QvDecodePipe> made(QvTestGenerator::create(&video, &audio));
+    ASSERT_TRUE(made);
+    ASSERT_EQ(made->open(), 0);
+    EXPECT_EQ(made->nrVideoStreams(), 1);
+    EXPECT_EQ(made->nrFrames(0), 59);
+    EXPECT_EQ(made->getVideoParam(0, "pal").toInt32(), 0);
+    EXPECT_EQ(made->getVideoParam(0, "nrViews").toInt32(), 1);
+    EXPECT_DOUBLE_EQ(made->getVideoParam(0, "frameAspect").toDouble(), 4 / 3.0);
+    EXPECT_DOUBLE_EQ(made->getVideoParam(0, "vDuration").toDouble(), 2.0);
+    EXPECT_TRUE(made->getVideoParam(0, "videoCodec") == "BGR4");
+    EXPECT_EQ(made->nrSamples(0), 66150) << "always 44100 Hz";
+    EXPECT_EQ(made->getAudioParam(0, "channels").toInt32(), 2);
+    EXPECT_EQ(made->getParam("isMeta").toInt32(), 1);
+
+    AnyDict state;
+    made->store(state);
+    std::unique_ptr<QvCodec> restored(qv_registry()->newCodec("testgen"));
+    ASSERT_EQ(restored->restore(state), 0);
+    EXPECT_EQ(restored->open(), 0);
+    EXPECT_EQ(restored->getParam("video0/width").toInt32(), 320);
+
+    std::unique_ptr<QvDecodePipe> none(
+        QvTestGenerator::create(static_cast<GeneratorVParams*>(nullptr), nullptr));
+    EXPECT_EQ(none->open(), -13);
+    EXPECT_STREQ(none->errorDesc(), "Invalid initialization data - no streams defined");
+    EXPECT_EQ(none->getState(), 2);
+}
+
+TEST_F(Testgen, PalRatesAreThoseInQuarterSteps) {
+    const struct {
+        double rate;
+        int pal;
+    } cases[] = {{24, 1}, {25, 1}, {30, 1}, {12.5, 1}, {23.976, 0}, {29.97, 0}, {59.94, 0}};
+    for (const auto& c : cases) {
+        ASSERT_EQ(openVideo(videoDict(64, 64, c.rate, 1)), 0);
+        EXPECT_EQ(decoder.getVideoParam(0, "pal").toInt32(), c.pal) << c.rate;
+    }
+}
+
+TEST_F(Testgen, FramesCountUpFromWhereTheSeekWent) {
+    ASSERT_EQ(openVideo(videoDict(160, 120, 25, 0.2)), 0);
+    EXPECT_EQ(decoder.nrFrames(0), 5);
+    std::vector<std::string> pictures;
+    for (int i = 0; i < 7; ++i) {
+        ASSERT_EQ(decoder.readFrame(0), 0);
+        EXPECT_EQ(decoder.getFramePtr(0)->frameNr, i) << "also behind the end";
+        pictures.push_back(pixels(*decoder.getFramePtr(0)));
+    }
+    EXPECT_FALSE(pictures[0] == pictures[1]) << "the cursor moves";
+    for (const int i : {3, 0, 6, 0}) {
+        ASSERT_EQ(decoder.seekToFrame(i, 0), 0);
+        ASSERT_EQ(decoder.readFrame(0), 0);
+        EXPECT_EQ(decoder.getFramePtr(0)->frameNr, i);
+        EXPECT_TRUE(pixels(*decoder.getFramePtr(0)) == pictures[static_cast<std::size_t>(i)]);
+    }
+    ASSERT_EQ(decoder.seek(MediaTime(0.12), qvVideoStream, 0), 0);
+    ASSERT_EQ(decoder.readFrame(0), 0);
+    EXPECT_EQ(decoder.getFramePtr(0)->frameNr, 3);
+}
+
+TEST_F(Testgen, AReaderMaySpoilItsFrame) {
+    ASSERT_EQ(openVideo(videoDict(64, 64, 25, 1)), 0);
+    ASSERT_EQ(decoder.seekToFrame(2, 0), 0);
+    const std::string clean = pixels(*decoder.getFramePtr(0));
+    decoder.getFramePtr(0)->setBlack();
+    ASSERT_EQ(decoder.seekToFrame(2, 0), 0);
+    EXPECT_TRUE(pixels(*decoder.getFramePtr(0)) == clean);
+}
+
+TEST_F(Testgen, GrayBarsStandStill) {
+    decoder.setParam("mode", "graybar");
+    ASSERT_EQ(openVideo(videoDict(221, 64, 25, 1)), 0);
+    ASSERT_EQ(decoder.readFrame(0), 0);
+    const QvFrame& frame = *decoder.getFramePtr(0);
+    const std::string first = pixels(frame);
+    const int levels[] = {0, 26, 51, 77, 102, 128, 153, 179, 204, 230, 255};
+    for (int i = 0; i < 11; ++i) EXPECT_EQ(*frame.pixelPtr(i * 20 + 10, 30), levels[i]);
+    EXPECT_EQ(*frame.pixelPtr(220, 30), 128) << "the last column stays";
+    ASSERT_EQ(decoder.readFrame(0), 0);
+    EXPECT_TRUE(pixels(*decoder.getFramePtr(0)) == first);
+}
+
+TEST_F(Testgen, ViewsAreChainedFromTheHead) {
+    AnyDict dict = videoDict(64, 64, 25, 1);
+    dict.set("nrViews", Any(3));
+    ASSERT_EQ(openVideo(dict), 0);
+    ASSERT_EQ(decoder.seekToFrame(7, 0), 0);
+    const QvFrame* head = decoder.getFramePtr(0);
+    ASSERT_EQ(QvFrame_nrViews(head), 3);
+    for (const QvFrame* view = head; view; view = view->nextView()) EXPECT_EQ(view->frameNr, 7);
+}
+
+TEST_F(Testgen, OverridesRedrawAndRestore) {
+    ASSERT_EQ(open(AnyVector(Any(videoDict(320, 240, 25, 2))), AnyVector(Any(AnyDict("duration", 2.0)))), 0);
+    const std::string before = pixels(*decoder.getFramePtr(0));
+    EXPECT_EQ(decoder.setOverride(1, 0, "width", 100), -1);
+    EXPECT_EQ(decoder.setOverride(1, 0, "frameAspect", Any()), -1) << "nothing to go back to";
+
+    ASSERT_EQ(decoder.setOverride(1, 0, "frameAspect", 16.0 / 9), 0);
+    EXPECT_DOUBLE_EQ(decoder.getVideoParam(0, "pixelAspect").toDouble(), 16.0 / 9 * 240 / 320);
+    EXPECT_FALSE(pixels(*decoder.getFramePtr(0)) == before);
+    ASSERT_EQ(decoder.setOverride(1, 0, "frameAspect", Any()), 0);
+    EXPECT_TRUE(pixels(*decoder.getFramePtr(0)) == before);
+
+    ASSERT_EQ(decoder.setOverride(1, 0, "framerate", QvFramerate(50.0)), 0);
+    EXPECT_EQ(decoder.nrFrames(0), 100);
+    EXPECT_TRUE(decoder.getFramePtr(0)->framerate == QvFramerate(50.0));
+    ASSERT_EQ(decoder.setOverride(1, 0, "duration", 0.5), 0);
+    EXPECT_EQ(decoder.nrFrames(0), 25);
+    EXPECT_EQ(decoder.nrSamples(0), 22050);
+    EXPECT_EQ(decoder.readSamples(30000, 0), 22050);
+    for (const double aspect : {0.01, 30.0, 1e9})
+        EXPECT_EQ(decoder.setOverride(1, 0, "frameAspect", aspect), 0);
+
+    decoder.close();
+    ASSERT_EQ(decoder.open(), 0);
+    EXPECT_EQ(decoder.nrFrames(0), 50) << "nothing of an override is left";
+}
+
+TEST_F(Testgen, BeepsOnceASecondAndEnds) {
+    ASSERT_EQ(openAudio(2.5), 0);
+    const std::unique_ptr<QvPcm> beep(QvSoundBytes::create(0));
+    std::string heard;
+    int result = 0;
+    while ((result = decoder.readSamples(10007, 0)) > 0) {
+        const QvPcm& pcm = *decoder.getAudioPtr(0);
+        heard.append(reinterpret_cast<const char*>(pcm.ptr(0)), static_cast<std::size_t>(pcm.bytes()));
+        EXPECT_EQ(pcm.position() * 4, static_cast<long long>(heard.size()));
+    }
+    EXPECT_EQ(result, -4);
+    const auto second = std::string(reinterpret_cast<const char*>(beep->ptr(0)), 32448 * 4) +
+                        std::string((44100 - 32448) * 4, 0);
+    EXPECT_TRUE(heard == (second + second + second).substr(0, 110250 * 4));
+
+    ASSERT_EQ(decoder.seekToSample(50000, 0), 0);
+    ASSERT_EQ(decoder.readSamples(100000, 0), 60250) << "more than the buffer held";
+    EXPECT_EQ(std::memcmp(decoder.getAudioPtr(0)->ptr(0), heard.data() + 50000 * 4, 60250 * 4), 0);
+    EXPECT_EQ(decoder.seekToSample(110249, 0), 0);
+    for (const long long bad : {110250LL, -1LL}) EXPECT_THROW(decoder.seekToSample(bad, 0), QvAssertFailure);
+    EXPECT_EQ(decoder.getAudioStreamReport(0)->nrGroups(), 110250 / 1600 + 1);
+
+    ASSERT_EQ(openAudio(0), 0);
+    EXPECT_EQ(decoder.readSamples(10, 0), -4);
+}
+
+TEST_F(Testgen, SelectionIsKept) {
+    ASSERT_EQ(open(AnyVector(Any(videoDict(64, 64, 25, 1)), Any(videoDict(64, 64, 25, 1))), AnyVector()), 0);
+    EXPECT_EQ(decoder.select(1, 1), 0);
+    EXPECT_EQ(decoder.select(1, 2), -1);
+    EXPECT_EQ(decoder.select(4, 0), -1);
+    EXPECT_TRUE(decoder.isSelected(1, 1));
+    EXPECT_FALSE(decoder.isSelected(1, 0));
+    AnyDict numbers;
+    decoder.selected(numbers);
+    EXPECT_TRUE(numbers["video"] == Any(AnyVector(1)));
+    EXPECT_TRUE(numbers["audio"] == Any(AnyVector()));
+}
+
+TEST_F(Testgen, MissingParametersAssertAndLeaveItClosed) {
+    AnyDict noRate = videoDict(64, 64, 25, 1);
+    noRate.remove("framerate");
+    AnyDict noDuration = videoDict(64, 64, 25, 1);
+    noDuration.remove("duration");
+    AnyDict badPicture = videoDict(64, 64, 25, 1);
+    badPicture.set("picture", Any(5));
+    AnyDict noFile = videoDict(64, 64, 25, 1);
+    noFile.set("picture", Any("/no/such/picture.png"));
+    for (const AnyDict& dict : {noRate, noDuration, badPicture, noFile, videoDict(31, 31, 25, 1)}) {
+        EXPECT_THROW(openVideo(dict), QvAssertFailure);
+        EXPECT_EQ(decoder.getState(), 2);
+        EXPECT_EQ(decoder.nrStreams(1), 0);
+    }
+    EXPECT_THROW(decoder.readFrame(0), QvAssertFailure);
+    EXPECT_STREQ(decoder.errorDesc(), "unnamed.readFrame: stream not opened");
+    GeneratorPipe raw;
+    EXPECT_THROW(raw.setParam("mode", 1), QvAssertFailure);
+    EXPECT_EQ(raw.open(), -1);
+    EXPECT_STREQ(raw.errorDesc(), "Codec not inited");
+}
+
+TEST_F(Testgen, AnySizeAndRateDrawsInsideItsFrame) {
+    for (const auto& [width, height] :
+         {std::pair{16, 40}, {40, 16}, {1, 200}, {200, 1}, {33, 33}, {352, 1080}, {2000, 40}, {127, 61}})
+        for (const double rate : {1.0, 29.97, 60.0, 1000.0}) {
+            ASSERT_EQ(openVideo(videoDict(width, height, rate, 1)), 0);
+            for (int i = 0; i < 3; ++i) EXPECT_EQ(decoder.readFrame(0), 0) << width << "x" << height;
+        }
+    ASSERT_EQ(open(AnyVector(Any(videoDict(0, 64, 25, 1)), Any(videoDict(64, 64, 25, 1))), AnyVector()), 0);
+    EXPECT_EQ(decoder.nrStreams(1), 1) << "a stream that can not be is left out";
+}
+
+TEST_F(Testgen, APictureGivesTheSize) {
+    QvFrame picture;
+    picture.init(QvFourcc::BGR4, 96, 48);
+    AnyDict dict = videoDict(640, 480, 25, 1);
+    dict.set("picture", Any(static_cast<const void*>(&picture)));
+    ASSERT_EQ(openVideo(dict), 0);
+    EXPECT_EQ(decoder.getVideoParam(0, "width").toInt32(), 96);
+    dict.set("picture",
+             AnyVector(Any(static_cast<const void*>(&picture)), Any(static_cast<const void*>(&picture))));
+    ASSERT_EQ(openVideo(dict), 0);
+    EXPECT_EQ(decoder.getVideoParam(0, "height").toInt32(), 48);
+}
+
+}  // namespace

@@ -1,0 +1,233 @@
+#include "builtin/decoders/wavdec.h"
+
+#include <gtest/gtest.h>
+
+#include <string>
+
+#include "core/engine/qvexception.h"
+#include "core/media/qvbuffer.h"
+#include "tests/support/temp_folder.h"
+#include "tests/support/wav_bytes.h"
+
+namespace {
+
+class Wav : public testing::Test {
+  protected:
+    Wav() { decoder.init(); }
+
+    int open(const std::string& bytes) {
+        decoder.setParam("filename", folder.write("a.wav", bytes).c_str());
+        return decoder.open();
+    }
+    // Everything from the present position on, read in blocks of `block` samples.
+    std::string readAll(int block) {
+        std::string all;
+        while (true) {
+            const int count = decoder.readSamples(block, 0);
+            if (count <= 0) {
+                last = count;
+                return all;
+            }
+            const QvPcm& pcm = *decoder.getAudioPtr(0);
+            EXPECT_EQ(count, pcm.samples());
+            all.append(reinterpret_cast<const char*>(pcm.ptr(0)), static_cast<std::size_t>(pcm.bytes()));
+        }
+    }
+    int number(const char* name) { return decoder.getAudioParam(0, name).toInt32(); }
+
+    TempFolder folder;
+    WavDec decoder;
+    int last = 0;
+};
+
+std::string stereo16(std::string_view data) {
+    return riff(wavChunk("fmt ", wavFormat(1, 2, 48000, 16)) + wavChunk("data", data));
+}
+
+TEST_F(Wav, DescribesAndDeliversItsStream) {
+    const std::string data = patternBytes(4 * 10000);
+    const std::string file = stereo16(data);
+    ASSERT_EQ(open(file), 0);
+    EXPECT_EQ(decoder.nrStreams(0), 1);
+    EXPECT_EQ(decoder.nrSamples(0), 10000);
+    EXPECT_EQ(number("samplerate"), 48000);
+    EXPECT_EQ(number("channels"), 2);
+    EXPECT_EQ(number("bitsPerSample"), 16);
+    EXPECT_EQ(number("bytesPerSample"), 2);
+    EXPECT_DOUBLE_EQ(decoder.getAudioParam(0, "duration").toDouble(), 10000 / 48000.0);
+    EXPECT_FALSE(decoder.getAudioParam(0, "truncated").isValid());
+    EXPECT_EQ(decoder.getParam("filesize").toInt64(), static_cast<long long>(file.size()));
+    EXPECT_EQ(decoder.getParam("audio0/channels").toInt32(), 2);
+    EXPECT_EQ(decoder.duration(qvAudioStream, 0).position(48000), 10000);
+
+    EXPECT_TRUE(readAll(1601) == data);
+    EXPECT_EQ(last, -4);
+    EXPECT_EQ(decoder.getAudioPtr(0)->samples(), 0);
+}
+
+TEST_F(Wav, ReadsOfAnySizeAndSeeksGiveTheSameBytes) {
+    const std::string data = patternBytes(4 * 70000);
+    ASSERT_EQ(open(stereo16(data)), 0);
+    for (const int block : {1, 7, 4096, 5000, 65536, 70000, 2000000000}) {
+        ASSERT_EQ(decoder.seekToSample(0, 0), 0);
+        EXPECT_TRUE(readAll(block) == data) << block;
+    }
+    for (const long long sample : {69999LL, 1LL, 12345LL}) {
+        ASSERT_EQ(decoder.seekToSample(sample, 0), 0);
+        EXPECT_EQ(decoder.getAudioPtr(0)->position(), sample);
+        EXPECT_TRUE(readAll(4096) == data.substr(static_cast<std::size_t>(sample) * 4)) << sample;
+    }
+    EXPECT_EQ(decoder.readSamples(0, 0), 0);
+    EXPECT_EQ(decoder.readSamples(-1, 0), -4);
+    EXPECT_EQ(decoder.seekToSample(-1, 0), -4);
+    EXPECT_EQ(decoder.seekToSample(1LL << 62, 0), 0);
+    EXPECT_EQ(decoder.readSamples(10, 0), -4);
+}
+
+TEST_F(Wav, FindsItsChunksAmongOthers) {
+    const std::string format = wavChunk("fmt ", wavFormat(1, 1, 8000, 8));
+    const std::string data = "\x01\x02\x03\x04\x05\x06";
+    const std::string dataChunk = wavChunk("data", data);
+    const std::string extended = wavChunk("fmt ", wavExtensible(1, 1, 8000, 8, 4));
+    const std::string unpadded = "LIST" + leBytes(3, 4) + "abc";
+    const struct {
+        const char* what;
+        std::string file;
+    } cases[] = {
+        {"plain", riff(format + dataChunk)},
+        {"a chunk before the format", riff(wavChunk("LIST", "INFOabcd") + format + dataChunk)},
+        {"an odd one before", riff(wavChunk("LIST", "abc") + format + dataChunk)},
+        {"an odd one without its padding", riff(unpadded + format + dataChunk)},
+        {"an odd one behind", riff(format + wavChunk("LIST", "abc") + dataChunk)},
+        {"behind, without padding", riff(format + unpadded + dataChunk)},
+        {"the word in a text", riff(format + wavChunk("LIST", "ISFTdata\x02\0\0\0") + dataChunk)},
+        {"a format with an extension",
+         riff(wavChunk("fmt ", wavFormat(1, 1, 8000, 8) + leBytes(0, 2)) + dataChunk)},
+        {"extensible", riff(extended + dataChunk)},
+        {"chunks behind the data", riff(format + dataChunk + wavChunk("LIST", "INFOabcd"))},
+        {"a far chunk", riff(format + wavChunk("bext", std::string(90000, 'd')) + dataChunk)},
+        {"rubbish that is no chunk", riff(format + "xy" + dataChunk)},
+        {"64-bit sizes",
+         "RF64\xFF\xFF\xFF\xFF"
+         "WAVE" +
+             wavChunk("ds64", leBytes(100, 8) + leBytes(6, 8) + leBytes(6, 8) + leBytes(0, 4)) + format +
+             "data\xFF\xFF\xFF\xFF" + data + "tail"},
+    };
+    for (const auto& c : cases) {
+        ASSERT_EQ(open(c.file), 0) << c.what << ": " << decoder.errorDesc();
+        EXPECT_TRUE(readAll(4) == data) << c.what;
+        EXPECT_FALSE(decoder.getAudioParam(0, "truncated").isValid()) << c.what;
+    }
+}
+
+TEST_F(Wav, RefusesWhatItCanNotRead) {
+    const std::string format = wavChunk("fmt ", wavFormat(1, 2, 48000, 16));
+    const std::string data = wavChunk("data", patternBytes(64));
+    const auto with = [&](const std::string& fields) { return riff(wavChunk("fmt ", fields) + data); };
+    const char* unsupported = "WAV format not supported";
+    const char* unparsed = "Failed to parse WAV file";
+    const std::string padded = leBytes(1, 2) + leBytes(2, 2) + leBytes(48000, 4) + leBytes(384000, 4) +
+                               leBytes(8, 2) + leBytes(24, 2);
+    const struct {
+        const char* what;
+        std::string file;
+        const char* text;
+    } cases[] = {
+        {"float", with(wavFormat(3, 2, 48000, 32)), unsupported},
+        {"extensible float", with(wavExtensible(3, 2, 48000, 24, 3)), unsupported},
+        {"extensible without extension", with(wavFormat(0xFFFE, 2, 48000, 16)), unsupported},
+        {"no channel", with(wavFormat(1, 0, 48000, 16)), unsupported},
+        {"nine channels", with(wavFormat(1, 9, 48000, 16)), unsupported},
+        {"no rate", with(wavFormat(1, 2, 0, 16)), unsupported},
+        {"a negative rate", with(wavFormat(1, 2, 0x80000000, 16)), unsupported},
+        {"32 bits", with(wavFormat(1, 2, 48000, 32)), unsupported},
+        {"12 bits", with(wavFormat(1, 2, 48000, 12)), unsupported},
+        {"24 bits in four bytes", with(padded), unsupported},
+        {"another form", "RIFF" + leBytes(100, 4) + "AVI " + format + data, unparsed},
+        {"another container", riff(format + data, "RIFX"), unparsed},
+        {"an empty chunk before", riff(wavChunk("LIST", "") + format + data), unparsed},
+        {"a chunk of 2 GiB before", "RIFF" + leBytes(99, 4) + "WAVELIST" + leBytes(0x80000000, 4) + format,
+         unparsed},
+        {"a short format", riff(wavChunk("fmt ", "\1\0\2\0") + data), unparsed},
+        {"no format", riff(data), unparsed},
+        {"no data", riff(format + wavChunk("LIST", "abcd")), unparsed},
+        {"data too far", riff(format + std::string(100000, 'x') + data), unparsed},
+        {"nothing", "", unparsed},
+    };
+    for (const auto& c : cases) {
+        EXPECT_EQ(open(c.file), -15) << c.what;
+        EXPECT_STREQ(decoder.errorDesc(), c.text) << c.what;
+        EXPECT_EQ(decoder.getState(), 2) << c.what;
+    }
+    for (const Any& name : {Any(), Any(""), Any("/no/such/file.wav"), Any(folder.path().c_str())}) {
+        decoder.setParam("filename", name);
+        EXPECT_EQ(decoder.open(), -9);
+        EXPECT_STREQ(decoder.errorDesc(), "Failed to open file for reading");
+    }
+}
+
+TEST_F(Wav, TruncationAtEveryByteIsToldOrRefused) {
+    const std::string data = patternBytes(4 * 60);
+    const std::string whole = stereo16(data);
+    for (std::size_t length = 0; length <= whole.size(); ++length) {
+        if (length < 44) {
+            EXPECT_EQ(open(whole.substr(0, length)), -15) << length;
+            continue;
+        }
+        ASSERT_EQ(open(whole.substr(0, length)), 0) << length;
+        const long long present = static_cast<long long>(length - 44) / 4;
+        EXPECT_EQ(decoder.nrSamples(0), present);
+        EXPECT_TRUE(readAll(16) == data.substr(0, static_cast<std::size_t>(present) * 4));
+        EXPECT_EQ(last, -4);
+        EXPECT_EQ(decoder.getAudioParam(0, "truncated") == Any(1), present < 60) << length;
+        EXPECT_TRUE(decoder.getAudioParam(0, "samplesExpected") == (present < 60 ? Any(60LL) : Any()));
+    }
+}
+
+TEST_F(Wav, SizesThatWereNeverWrittenMeanToTheEnd) {
+    const std::string format = wavChunk("fmt ", wavFormat(1, 2, 48000, 16));
+    const std::string data = patternBytes(4 * 500);
+    for (const std::uint64_t size : {0ull, 0xFFFFFFFFull, 0x7FFFF000ull}) {
+        const std::string file =
+            "RIFF" + leBytes(size, 4) + "WAVE" + format + "data" + leBytes(size, 4) + data;
+        ASSERT_EQ(open(file), 0);
+        EXPECT_EQ(decoder.nrSamples(0), 500) << size;
+        EXPECT_FALSE(decoder.getAudioParam(0, "truncated").isValid()) << size;
+        EXPECT_EQ(decoder.getParam("filesize").toInt64(), static_cast<long long>(file.size())) << size;
+    }
+    ASSERT_EQ(open(riff(format + wavChunk("data", "") + wavChunk("LIST", "INFOabcd"))), 0);
+    EXPECT_EQ(decoder.nrSamples(0), 0) << "an empty chunk that others follow is empty";
+    EXPECT_EQ(decoder.readSamples(10, 0), -4);
+
+    ASSERT_EQ(open("RIFF" + leBytes(36, 4) + "WAVE" + format + "data" + leBytes(0xFFFFFFF0, 4) + data), 0);
+    EXPECT_EQ(decoder.nrSamples(0), 500);
+    EXPECT_EQ(decoder.getAudioParam(0, "samplesExpected").toInt64(), 0xFFFFFFF0 / 4);
+}
+
+TEST_F(Wav, FilesBeyondFourGigabytesAreReadToTheirEnd) {
+    const std::string head = "RIFF" + leBytes(0, 4) + "WAVE" + wavChunk("fmt ", wavFormat(1, 2, 48000, 16));
+    const long long bytes = (5LL << 30) + 8;
+    const std::string name =
+        folder.write("big.wav", head + "data" + leBytes(static_cast<std::uint32_t>(bytes), 4));
+    std::filesystem::resize_file(name, 44 + static_cast<std::uintmax_t>(bytes));  // sparse
+    decoder.setParam("filename", name.c_str());
+    ASSERT_EQ(decoder.open(), 0);
+    EXPECT_EQ(decoder.nrSamples(0), bytes / 4);
+    ASSERT_EQ(decoder.seekToSample(bytes / 4 - 10, 0), 0);
+    EXPECT_EQ(decoder.readSamples(100, 0), 10);
+}
+
+TEST_F(Wav, UnusedOperationsAndUnknownStreamsAssert) {
+    EXPECT_THROW(decoder.readSamples(1, 0), QvAssertFailure);
+    ASSERT_EQ(open(stereo16(patternBytes(64))), 0);
+    EXPECT_THROW(decoder.readSamples(1, 1), QvAssertFailure);
+    EXPECT_THROW(decoder.seekToSample(0, -1), QvAssertFailure);
+    EXPECT_THROW(decoder.readFrame(0), QvAssertFailure);
+    EXPECT_THROW(decoder.getFramePtr(0), QvAssertFailure);
+    EXPECT_EQ(decoder.open(), 0) << "reopening closes first";
+    EXPECT_EQ(decoder.nrStreams(0), 1);
+    EXPECT_EQ(decoder.close(), 0);
+    EXPECT_EQ(decoder.nrStreams(0), 0);
+}
+
+}  // namespace
