@@ -89,8 +89,8 @@ class QV_API QvPlatform {
 
     // --- Libraries and processes -----------------------------------------------------------------------
 
-    // A library with its dependencies, which are also looked for in its own folder. Null on failure, with the
-    // system's reason in `error`. Symbols stay local to the library.
+    // A library with its dependencies, which are also looked for in its own folder, by their sonames. Null on
+    // failure, with the system's reason in `error`. Symbols stay local to the library.
     virtual void* loadLibrary(const char* name, std::string& error);
     virtual void* findSymbol(void* library, const char* symbol);  // null if absent
     virtual void unloadLibrary(void* library);

@@ -70,12 +70,7 @@ void QvSemaphore::post(int count) {
 }
 
 QvThread::QvThread() = default;
-QvThread::~QvThread() {
-    if (thread_.joinable() && thread_.get_id() == std::this_thread::get_id())
-        thread_.detach();
-    else
-        wait();
-}
+QvThread::~QvThread() { wait(); }
 
 int QvThread::start(std::function<void()> body) {
     if (thread_.joinable()) return -1;
@@ -84,7 +79,7 @@ int QvThread::start(std::function<void()> body) {
 }
 
 void QvThread::wait() {
-    if (thread_.joinable() && thread_.get_id() != std::this_thread::get_id()) thread_.join();
+    if (thread_.joinable()) thread_.join();
 }
 
 QvLowPriority::QvLowPriority() : former_(qv_platform().lowerThreadPriority()) {}

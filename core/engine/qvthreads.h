@@ -71,7 +71,7 @@ class QV_API QvSemaphore {
     std::unique_ptr<State> state_;
 };
 
-// One worker thread. The destructor waits for it.
+// One worker thread. The destructor waits for it; neither that nor wait() may be called by the body itself.
 class QV_API QvThread {
   public:
     QvThread();
@@ -82,9 +82,7 @@ class QV_API QvThread {
     // Runs `body`, which must not throw, on a new thread. -1 if one is running or not waited for yet, or if
     // the system has no more.
     int start(std::function<void()> body);
-    // Until the body has ended; at once if none was started. Not to be called by the body: that returns at
-    // once too, since it could never end.
-    void wait();
+    void wait();  // until the body has ended; at once if none was started
     bool started() const { return thread_.joinable(); }
 
   private:

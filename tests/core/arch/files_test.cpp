@@ -1,0 +1,121 @@
+#include <fcntl.h>
+#include <gtest/gtest.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <filesystem>
+
+#include "core/arch/platform.h"
+#include "tests/support/platform_scope.h"
+#include "tests/support/temp_folder.h"
+
+namespace {
+
+namespace fs = std::filesystem;
+
+class Files : public testing::Test {
+  protected:
+    TempFolder temp;
+    QvPlatform& platform = qv_platform();
+
+    std::string make(std::string_view name, std::string_view bytes = "x") { return temp.write(name, bytes); }
+};
+
+TEST_F(Files, ModesThatAreNoneAndFoldersDoNotOpen) {
+    make("there", "kept");
+    for (const char* mode : {"", "x", "+", "q+"})
+        EXPECT_EQ(platform.openFile(temp.file("there").c_str(), mode), nullptr) << mode;
+    for (const char* mode : {"r", "rb", "w", "a+"})
+        EXPECT_EQ(platform.openFile(temp.path().c_str(), mode), nullptr) << mode;
+    EXPECT_EQ(TempFolder::read(temp.file("there")), "kept");
+}
+
+TEST_F(Files, OpenFilesAreNotInherited) {
+    std::FILE* const file = platform.openFile(make("a").c_str(), "r+b");
+    ASSERT_NE(file, nullptr);
+    EXPECT_TRUE(fcntl(fileno(file), F_GETFD) & FD_CLOEXEC);
+    std::fclose(file);
+}
+
+TEST_F(Files, PositionsBeyondFourGigabytesAreExact) {
+    std::FILE* const file = platform.openFile(temp.file("sparse").c_str(), "w+b");
+    ASSERT_NE(file, nullptr);
+    constexpr long long far = 0x1'2345'6789;
+    EXPECT_EQ(platform.seek(file, far, SEEK_SET), 0);
+    std::fputc('z', file);
+    EXPECT_EQ(platform.tell(file), far + 1);
+    EXPECT_EQ(platform.seek(file, -1, SEEK_END), 0);
+    EXPECT_EQ(std::fgetc(file), 'z');
+    EXPECT_EQ(platform.seek(file, -1, SEEK_SET), -1);
+    std::fclose(file);
+}
+
+TEST_F(Files, MovingWithoutReplaceNeverTouchesATarget) {
+    const std::string from = make("from", "new"), to = make("to", "old");
+    EXPECT_EQ(platform.moveFile(from.c_str(), to.c_str(), false), -1);
+    EXPECT_EQ(TempFolder::read(to), "old");
+    EXPECT_EQ(TempFolder::read(from), "new");
+    EXPECT_EQ(platform.moveFile(from.c_str(), to.c_str(), true), 0);
+    EXPECT_EQ(TempFolder::read(to), "new");
+    EXPECT_FALSE(fs::exists(from));
+}
+
+// /dev/shm is a disc of its own on Linux.
+TEST_F(Files, MovingToAnotherDiscKeepsContentAndTimeAndLeavesNoPart) {
+    const std::string from = make("from", std::string(3'000'000, 'm'));
+    const fs::path other = fs::path("/dev/shm") / temp.path().filename();
+    std::error_code error;
+    if (!fs::create_directory(other, error)) GTEST_SKIP() << "no second disc";
+    if (struct stat a, b; stat(from.c_str(), &a) == 0 && stat(other.c_str(), &b) == 0 && a.st_dev == b.st_dev)
+        GTEST_SKIP() << "one disc only";
+    const auto time = fs::last_write_time(from);
+    const std::string to = (other / "to").string();
+
+    EXPECT_EQ(platform.moveFile(from.c_str(), to.c_str(), false), 0);
+    EXPECT_FALSE(fs::exists(from));
+    EXPECT_EQ(fs::file_size(to), 3'000'000u);
+    EXPECT_EQ(fs::last_write_time(to), time);
+
+    make("second", "two");
+    EXPECT_EQ(platform.moveFile(temp.file("second").c_str(), to.c_str(), false), -1);
+    EXPECT_EQ(fs::file_size(to), 3'000'000u);
+    EXPECT_TRUE(fs::exists(temp.file("second")));
+    EXPECT_EQ(std::distance(fs::directory_iterator(other), {}), 1);
+    fs::remove_all(other);
+}
+
+TEST_F(Files, StatusFollowsLinksAndSameFileSeesThroughThem) {
+    const std::string file = make("file", "12345");
+    fs::create_symlink(file, temp.file("link"));
+    fs::create_hard_link(file, temp.file("hard"));
+    fs::create_symlink(temp.file("nowhere"), temp.file("dangling"));
+    QvFileStatus status;
+    ASSERT_TRUE(platform.status(temp.file("link").c_str(), status));
+    EXPECT_EQ(status.size, 5);
+    EXPECT_TRUE(status.isRegular);
+    EXPECT_FALSE(platform.status(temp.file("dangling").c_str(), status));
+    EXPECT_TRUE(platform.sameFile(file.c_str(), temp.file("hard").c_str()));
+    EXPECT_TRUE(platform.sameFile(file.c_str(), (temp.path() / "." / "link").c_str()));
+    EXPECT_FALSE(platform.sameFile(file.c_str(), make("other").c_str()));
+    EXPECT_FALSE(platform.sameFile(temp.file("gone").c_str(), temp.file("gone").c_str()));
+}
+
+TEST_F(Files, FreeSpaceOfAFileToComeIsThatOfItsFolder) {
+    EXPECT_GT(platform.freeSpace(temp.file("new/deep/file").c_str()), 0);
+    EXPECT_GT(platform.freeSpace("relative-and-absent"), 0);
+    EXPECT_EQ(platform.freeSpace(""), -1);
+}
+
+TEST_F(Files, ADiscThatFillsUpShowsAsAShortWriteOrAFailedClose) {
+    FullDisc disc(10);
+    const PlatformScope scope(disc);
+    std::FILE* const file = qv_platform().openFile(temp.file("out").c_str(), "wb");
+    ASSERT_NE(file, nullptr);
+    const std::size_t written = std::fwrite("0123456789abcdef", 1, 16, file);
+    EXPECT_TRUE(written < 16 || std::fflush(file) != 0);
+    std::fclose(file);
+    EXPECT_EQ(TempFolder::read(temp.file("out")), "0123456789");
+    EXPECT_EQ(qv_platform().freeSpace("/"), 0);
+}
+
+}  // namespace

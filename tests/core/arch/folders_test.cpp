@@ -1,0 +1,102 @@
+#include <gtest/gtest.h>
+#include <sys/resource.h>
+
+#include <algorithm>
+#include <filesystem>
+
+#include "core/arch/platform.h"
+#include "tests/support/temp_folder.h"
+
+namespace {
+
+namespace fs = std::filesystem;
+
+class Folders : public testing::Test {
+  protected:
+    TempFolder temp;
+    QvPlatform& platform = qv_platform();
+
+    std::vector<std::string> list(const std::string& folder) {
+        std::vector<QvFolderEntry> entries;
+        EXPECT_EQ(platform.listFolder(folder.c_str(), entries), 0);
+        std::vector<std::string> names;
+        for (const auto& entry : entries) names.push_back(entry.name + (entry.isFolder ? "/" : ""));
+        return names;
+    }
+    std::string folder(std::string_view name) {
+        fs::create_directories(temp.path() / name);
+        return temp.file(name);
+    }
+};
+
+TEST_F(Folders, ListingSortsTellsFoldersThroughLinksAndKeepsAnyBytes) {
+    folder("sub");
+    temp.write("b", "");
+    temp.write("\xFF\xFE", "");
+    temp.write("A", "");
+    fs::create_symlink("sub", temp.file("link"));
+    fs::create_symlink("gone", temp.file("dangling"));
+    const std::vector<std::string> expected = {"./",       "../",   "A",    "b",
+                                               "dangling", "link/", "sub/", "\xFF\xFE"};
+    EXPECT_EQ(list(temp.path()), expected);
+}
+
+TEST_F(Folders, ListingLeavesTheCurrentFolderAndFailsOnWhatIsNone) {
+    const std::string before = platform.currentFolder();
+    list(temp.path());
+    EXPECT_EQ(platform.currentFolder(), before);
+    std::vector<QvFolderEntry> entries;
+    EXPECT_EQ(platform.listFolder(temp.write("file", "").c_str(), entries), -1);
+    EXPECT_EQ(platform.listFolder("", entries), -1);
+    EXPECT_TRUE(entries.empty());
+}
+
+TEST_F(Folders, RemovalNeverLeavesTheFolderThroughALink) {
+    const std::string outside = folder("outside"), inside = folder("inside/deep");
+    temp.write("outside/precious", "kept");
+    fs::create_directory_symlink(outside, temp.file("inside/deep/way-out"));
+    fs::create_symlink(temp.file("outside/precious"), temp.file("inside/file-link"));
+    EXPECT_EQ(platform.removeTree(temp.file("inside").c_str(), nullptr), 0);
+    EXPECT_FALSE(fs::exists(temp.file("inside")));
+    EXPECT_EQ(TempFolder::read(temp.file("outside/precious")), "kept");
+
+    fs::create_directory_symlink(outside, temp.file("link"));
+    for (const char* name : {"link", "link/", "link//"})
+        EXPECT_EQ(platform.removeTree(temp.file(name).c_str(), nullptr), -1) << name;
+    EXPECT_EQ(TempFolder::read(temp.file("outside/precious")), "kept");
+}
+
+TEST_F(Folders, RemovalKeepsWhatItIsToldAndSaysSo) {
+    const std::string top = folder("top/sub");
+    temp.write("top/sub/keep.me", "k");
+    temp.write("top/sub/other", "o");
+    temp.write("top/loose", "l");
+    const auto keep = [](std::string_view name) { return name == "keep.me"; };
+    EXPECT_EQ(platform.removeTree(temp.file("top").c_str(), keep), -1);
+    EXPECT_TRUE(fs::exists(temp.file("top/sub/keep.me")));
+    EXPECT_FALSE(fs::exists(temp.file("top/sub/other")));
+    EXPECT_FALSE(fs::exists(temp.file("top/loose")));
+}
+
+TEST_F(Folders, ATreeDeeperThanFilesMayBeOpenIsRefusedWithoutHarm) {
+    std::string deep = "top";
+    for (int i = 0; i < 80; ++i) deep += "/d";
+    folder(deep);
+    rlimit former;
+    ASSERT_EQ(getrlimit(RLIMIT_NOFILE, &former), 0);
+    const rlimit few{40, former.rlim_max};
+    ASSERT_EQ(setrlimit(RLIMIT_NOFILE, &few), 0);
+    EXPECT_EQ(platform.removeTree(temp.file("top").c_str(), nullptr), -1);
+    EXPECT_TRUE(fs::exists(temp.file(deep)));
+    setrlimit(RLIMIT_NOFILE, &former);
+    EXPECT_EQ(platform.removeTree(temp.file("top").c_str(), nullptr), 0);
+}
+
+TEST_F(Folders, MakingIsIdempotentForFoldersOnly) {
+    EXPECT_EQ(platform.makeFolder(temp.file("new").c_str()), 0);
+    EXPECT_EQ(platform.makeFolder(temp.file("new").c_str()), 0);
+    EXPECT_EQ(platform.makeFolder(temp.write("file", "").c_str()), -1);
+    EXPECT_EQ(platform.makeFolder(temp.file("a/b").c_str()), -1);
+}
+
+}  // namespace

@@ -1,0 +1,152 @@
+#include "core/arch/platform.h"
+
+#include <gtest/gtest.h>
+#include <sched.h>
+
+#include <atomic>
+#include <cstdint>
+#include <cstdlib>
+#include <filesystem>
+#include <limits>
+
+#include "tests/support/platform_scope.h"
+#include "tests/support/temp_folder.h"
+
+namespace {
+
+// Sets a variable of the environment, or clears it, for the length of a block.
+class Variable {
+  public:
+    Variable(const char* name, const char* value) : name_(name) {
+        had_ = qv_platform().environment(name, former_);
+        value ? setenv(name, value, 1) : unsetenv(name);
+    }
+    ~Variable() { had_ ? setenv(name_, former_.c_str(), 1) : unsetenv(name_); }
+
+  private:
+    const char* name_;
+    std::string former_;
+    bool had_;
+};
+
+TEST(Platform, PlacesFallBackWhereVariablesAreUnsetOrEmpty) {
+    {
+        const Variable home("HOME", "/some/home/"), temp("TMPDIR", "/some/temp//");
+        EXPECT_EQ(qv_platform().homeFolder(), "/some/home");
+        EXPECT_EQ(qv_platform().tempFolder(), "/some/temp");
+    }
+    for (const char* value : {static_cast<const char*>(nullptr), ""}) {
+        const Variable home("HOME", value), temp("TMPDIR", value);
+        EXPECT_EQ(qv_platform().homeFolder().front(), '/');
+        EXPECT_EQ(qv_platform().tempFolder(), "/tmp");
+    }
+}
+
+TEST(Platform, ASubstituteIsInForceUntilItsScopeEnds) {
+    struct Named : QvPlatform {
+        std::string platformName() override { return "substitute"; }
+    } named;
+    {
+        const PlatformScope scope(named);
+        EXPECT_EQ(qv_platform().platformName(), "substitute");
+        EXPECT_GT(qv_platform().processors(), 0);
+    }
+    EXPECT_NE(qv_platform().platformName(), "substitute");
+}
+
+TEST(Platform, PriorityComesBackWithoutPrivilege) {
+    std::thread([] {
+        const int before = sched_getscheduler(0);
+        const int former = qv_platform().lowerThreadPriority();
+        EXPECT_TRUE(before != SCHED_OTHER || sched_getscheduler(0) == SCHED_BATCH);
+        const int inner = qv_platform().lowerThreadPriority();
+        qv_platform().restoreThreadPriority(inner);
+        EXPECT_TRUE(before != SCHED_OTHER || sched_getscheduler(0) == SCHED_BATCH);
+        qv_platform().restoreThreadPriority(former);
+        EXPECT_EQ(sched_getscheduler(0), before);
+    }).join();
+}
+
+TEST(Platform, BlocksAreAlignedAndTooMuchIsNull) {
+    for (const std::size_t alignment : {1u, 8u, 64u, 4096u}) {
+        for (const std::size_t bytes : {0u, 1u, 63u, 100'001u}) {
+            void* const block = qv_platform().allocate(bytes, alignment);
+            ASSERT_NE(block, nullptr);
+            EXPECT_EQ(reinterpret_cast<std::uintptr_t>(block) % alignment, 0u);
+            qv_platform().release(block);
+        }
+    }
+    EXPECT_EQ(qv_platform().allocate(std::numeric_limits<std::size_t>::max() - 5, 64), nullptr);
+    qv_platform().release(nullptr);
+}
+
+TEST(Platform, CodepagesDecodeAndMarkWhatIsNotValid) {
+    const struct {
+        int number;
+        std::string_view bytes;
+        std::u32string_view text;
+    } cases[] = {
+        {1252, "\x80\xE9", U"\u20AC\u00E9"},
+        {1251, "\xCF\xF0", U"\u041F\u0440"},
+        {28605, "\xA4", U"\u20AC"},
+        {932, "\x83\x65\x41", U"\u30C6A"},
+        {950, "\xA4\xA4", U"\u4E2D"},
+        {949, "\xB0\xA1", U"\uAC00"},
+        {50220, "\x1B$B$\"\x1B(B.", U"\u3042."},
+        {65001,
+         "a\xFF"
+         "b",
+         U"a\uFFFDb"},
+        {932, "A\x83", U"A\uFFFD"},  // cut off within a character
+        {1252, "", U""},
+    };
+    for (const auto& c : cases) {
+        std::u32string text;
+        ASSERT_TRUE(qv_platform().decodeCodepage(c.number, c.bytes, text)) << c.number;
+        EXPECT_EQ(text, c.text) << c.number;
+    }
+    std::u32string text;
+    EXPECT_FALSE(qv_platform().decodeCodepage(99999, "x", text));
+    EXPECT_FALSE(qv_platform().hasCodepage(-1));
+    // Longer than the converter's block, so that it is filled again.
+    ASSERT_TRUE(qv_platform().decodeCodepage(1252, std::string(10'000, '\xE9'), text));
+    EXPECT_EQ(text, std::u32string(10'000, U'\u00E9'));
+}
+
+TEST(Platform, FontsAreFilesAndFacesDiffer) {
+    const std::string sans = qv_platform().fontFile(QvFontFace::sans);
+    if (sans.empty()) GTEST_SKIP() << "no fonts here";
+    for (const auto face :
+         {QvFontFace::sans, QvFontFace::sansItalic, QvFontFace::sansBold, QvFontFace::monospaceBold})
+        EXPECT_TRUE(std::filesystem::is_regular_file(qv_platform().fontFile(face)));
+}
+
+TEST(Platform, LibrariesFindDependenciesInTheirOwnFolder) {
+    const TempFolder temp;
+    const std::string in = "cd " + qv_platform().quoteForShell(temp.path().string()) + " && ";
+    temp.write("low.c", "int low(void) { return 40; }");
+    temp.write("mid.c", "int low(void); int mid(void) { return low() + 1; }");
+    temp.write("top.c", "int mid(void); int top(void) { return mid() + 1; }");
+    const auto run = [&](const char* command) { return qv_platform().runCommand((in + command).c_str()); };
+    if (run("cc -shared -fPIC -Wl,-soname,liblow-qv.so -o liblow-qv.so low.c 2>/dev/null") != 0)
+        GTEST_SKIP() << "no C compiler";
+    ASSERT_EQ(run("cc -shared -fPIC -Wl,-soname,libmid-qv.so -o libmid-qv.so mid.c -L. -llow-qv"), 0);
+    ASSERT_EQ(run("cc -shared -fPIC -o top_plugin.so top.c -L. -lmid-qv"), 0);
+
+    std::string error;
+    void* const library = qv_platform().loadLibrary(temp.file("top_plugin.so").c_str(), error);
+    ASSERT_NE(library, nullptr) << error;
+    const auto top = reinterpret_cast<int (*)()>(qv_platform().findSymbol(library, "top"));
+    ASSERT_NE(top, nullptr);
+    EXPECT_EQ(top(), 42);
+    EXPECT_EQ(qv_platform().findSymbol(library, "no_such_symbol"), nullptr);
+    qv_platform().unloadLibrary(library);
+
+    std::filesystem::remove(temp.file("liblow-qv.so"));
+    EXPECT_EQ(qv_platform().loadLibrary(temp.file("top_plugin.so").c_str(), error), nullptr);
+    EXPECT_NE(error, "");
+    EXPECT_EQ(qv_platform().loadLibrary(temp.write("text_plugin.so", "no library").c_str(), error), nullptr);
+    EXPECT_EQ(qv_platform().loadLibrary(temp.file("absent_plugin.so").c_str(), error), nullptr);
+}
+
+}  // namespace

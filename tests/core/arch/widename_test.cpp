@@ -1,0 +1,62 @@
+#include "core/arch/widename.h"
+
+#include <gtest/gtest.h>
+
+#include <random>
+#include <vector>
+
+namespace {
+
+std::vector<unsigned> units(std::string_view bytes) {
+    const QvWideString wide = qv_wide_name(bytes);
+    return {wide.begin(), wide.end()};
+}
+
+std::string bytes(const std::vector<unsigned short>& wide) {
+    return qv_narrow_name(wide.data(), wide.size());
+}
+
+using Units = std::vector<unsigned>;
+
+TEST(WideName, StrayBytesBecomeEscapesAndWellFormedTextItsUnits) {
+    const struct {
+        std::string_view bytes;
+        Units units;
+    } cases[] = {
+        {"a\xC3\xA9", {'a', 0xE9}},
+        {"\xE2\x82\xAC", {0x20AC}},
+        {"\xF0\x9F\x8E\xAC", {0xD83C, 0xDFAC}},
+        {"\xFF", {0xDCFF}},
+        {"\xC3(", {0xDCC3, '('}},
+        {"\xE2\x82", {0xDCE2, 0xDC82}},                          // cut off
+        {"\xC0\xAF", {0xDCC0, 0xDCAF}},                          // "/" in two bytes
+        {"\xE0\x80\xAF", {0xDCE0, 0xDC80, 0xDCAF}},              // and in three
+        {"\xED\xB2\x80", {0xDCED, 0xDCB2, 0xDC80}},              // an escape, encoded
+        {"\xF4\x90\x80\x80", {0xDCF4, 0xDC90, 0xDC80, 0xDC80}},  // above U+10FFFF
+    };
+    for (const auto& c : cases) {
+        EXPECT_EQ(units(c.bytes), c.units) << testing::PrintToString(c.bytes);
+        const QvWideString wide = qv_wide_name(c.bytes);
+        EXPECT_EQ(qv_narrow_name(wide.data(), wide.size()), c.bytes);
+    }
+}
+
+TEST(WideName, EveryByteStringComesBack) {
+    std::mt19937 random(7);
+    for (int round = 0; round < 20000; ++round) {
+        std::string name(random() % 12, '\0');
+        // Lead and continuation bytes more often than chance, so that sequences nearly form.
+        for (char& c : name) c = static_cast<char>(random() % 3 ? 0x80 | random() % 128 : random() % 256);
+        const QvWideString wide = qv_wide_name(name);
+        ASSERT_EQ(qv_narrow_name(wide.data(), wide.size()), name) << testing::PrintToString(name);
+    }
+}
+
+TEST(WideName, LoneSurrogatesThatNameNoByteKeepTheirUnitsApart) {
+    EXPECT_EQ(bytes({0xD800}), "\xED\xA0\x80");
+    EXPECT_EQ(bytes({'x', 0xDC7F}), "x\xED\xB1\xBF");
+    EXPECT_EQ(bytes({0xD83C, 0xD83C, 0xDFAC}), "\xED\xA0\xBC\xF0\x9F\x8E\xAC");
+    EXPECT_EQ(bytes({}), "");
+}
+
+}  // namespace

@@ -1,0 +1,28 @@
+#include "core/engine/codeccompat.h"
+
+#include <gtest/gtest.h>
+
+#include "core/engine/qvexception.h"
+
+namespace {
+
+TEST(CodecCompatList, NamesAreAddedOnceAndOnlyToKnownCodecs) {
+    CodecCompat list;
+    EXPECT_THROW(list.add("rawvenc", "rawmux"), QvAssertFailure);
+    EXPECT_THROW(list.removeName("rawvenc", "rawmux"), QvAssertFailure);
+    list.addCodec("rawvenc");
+    list.add("rawvenc", "rawmux");
+    list.add("rawvenc", "rawmux");
+    list.add("rawvenc", "rawavimux");
+    list.addCodec("rawvenc");
+    EXPECT_EQ(list.names("rawvenc").size(), 2);
+    EXPECT_TRUE(list.isCompatible("rawvenc", "rawavimux"));
+    list.removeName("rawvenc", "absent");
+    list.removeName("rawvenc", "rawmux");
+    EXPECT_FALSE(list.isCompatible("rawvenc", "rawmux"));
+    EXPECT_TRUE(list.isCompatible("rawvenc", "rawavimux"));
+    EXPECT_FALSE(list.isCompatible("other", "rawmux"));
+    EXPECT_FALSE(list.isCompatible(nullptr, "rawmux"));
+}
+
+}  // namespace

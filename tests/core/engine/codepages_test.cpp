@@ -1,0 +1,41 @@
+#include "core/engine/codepages.h"
+
+#include <gtest/gtest.h>
+
+#include <set>
+#include <string>
+
+#include "core/arch/platform.h"
+
+namespace {
+
+TEST(Codepages, NamesOfKnownAndUnknownNumbers) {
+    EXPECT_STREQ(codepage_name(20000).description, "CNS Taiwan; Chinese Traditional (CNS)");
+    EXPECT_STREQ(codepage_name(20000).name, "x-Chinese_CNS");
+    EXPECT_STREQ(codepage_name(37).name, "IBM037");
+    EXPECT_STREQ(codepage_name(65001).name, "utf-8");
+    for (const int number : {-1, 0, 36, 28602, 65002}) {
+        EXPECT_STREQ(codepage_name(number).description, "");
+        EXPECT_STREQ(codepage_name(number).name, "");
+    }
+}
+
+TEST(Codepages, WhatIsOfferedCanBeConvertedAndHasAName) {
+    AnyVector list("left over");
+    EXPECT_EQ(available_codepages(list), 0);
+    std::set<int> numbers;
+    for (const Any& entry : list) {
+        const int number = entry.asDict().getInt32("identifier", -1);
+        EXPECT_TRUE(numbers.empty() || number > *numbers.rbegin());
+        numbers.insert(number);
+        EXPECT_NE(std::string(entry.asDict().getString("name", "")), "") << number;
+        std::u32string text;
+        ASSERT_TRUE(qv_platform().decodeCodepage(number, "A1", text)) << number;
+        EXPECT_EQ(text, U"A1") << number;
+    }
+    for (const int number : {874, 932, 936, 949, 950, 1250, 1258, 20866, 28591, 28605, 38598, 51949})
+        EXPECT_TRUE(numbers.count(number)) << number;
+    for (const int number : {437, 1200, 28602, 65001}) EXPECT_FALSE(numbers.count(number)) << number;
+}
+
+}  // namespace

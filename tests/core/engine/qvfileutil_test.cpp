@@ -1,0 +1,145 @@
+#include "core/engine/qvfileutil.h"
+
+#include <fcntl.h>
+#include <gtest/gtest.h>
+#include <sys/stat.h>
+
+#include <cstdlib>
+#include <ctime>
+#include <filesystem>
+
+#include "core/arch/widename.h"
+#include "core/media/datetime.h"
+#include "tests/support/log_capture.h"
+#include "tests/support/platform_scope.h"
+#include "tests/support/temp_folder.h"
+
+namespace {
+
+namespace fs = std::filesystem;
+
+Any narrow(const std::string& name) { return Any(name.c_str()); }
+Any wide(const std::string& name) { return Any(qv_wide_name(name).c_str()); }
+
+// Everything is asked for by narrow and by wide names.
+class FileUtil : public testing::TestWithParam<Any (*)(const std::string&)> {
+  protected:
+    TempFolder temp;
+    Any name(std::string_view file) { return GetParam()(temp.file(file)); }
+};
+INSTANTIATE_TEST_SUITE_P(Widths, FileUtil, testing::Values(narrow, wide),
+                         [](const auto& info) { return info.index == 0 ? "Narrow" : "Wide"; });
+
+TEST_P(FileUtil, FilesWithAnyBytesInTheirNamesOpenAndGo) {
+    for (const char* file : {"plain", "\xC3\xA9\xF0\x9F\x8E\xAC", "\xFF\xC3", "a'b \"c\n"}) {
+        void* const stream = qvfopen(name(file), "wb");
+        ASSERT_NE(stream, nullptr) << file;
+        std::fputs("12345", static_cast<std::FILE*>(stream));
+        EXPECT_EQ(QvFile::ftell64(stream), 5);
+        EXPECT_EQ(std::fclose(static_cast<std::FILE*>(stream)), 0);
+        EXPECT_TRUE(fs::exists(temp.file(file)));
+        EXPECT_TRUE(QvFile::isFile(name(file)));
+        EXPECT_EQ(QvFile::flength(name(file)), 5);
+        EXPECT_EQ(QvFile::rm(name(file)), 0);
+        EXPECT_EQ(QvFile::rm(name(file)), -1);
+    }
+}
+
+TEST_P(FileUtil, AFileThatDoesNotOpenIsALineInTheLog) {
+    LogCapture log;
+    EXPECT_EQ(qvfopen(name("absent"), "rb"), nullptr);
+    EXPECT_EQ(qvfopen(name(""), "rb"), nullptr);
+    EXPECT_TRUE(log.contains("qvfopen: failed to open '" + temp.file("absent") + "' in mode 'rb'", 32));
+    EXPECT_EQ(QvFile::flength(name("absent")), -1);
+    EXPECT_EQ(QvFile::flength(name("")), -1);
+}
+
+TEST_P(FileUtil, LengthKeepsThePlaceInAStream) {
+    temp.write("f", "0123456789");
+    void* const stream = qvfopen(name("f"), "rb");
+    ASSERT_NE(stream, nullptr);
+    EXPECT_EQ(QvFile::fseek64(stream, 4, SEEK_SET), 0);
+    EXPECT_EQ(QvFile::flength(stream), 10);
+    EXPECT_EQ(std::fgetc(static_cast<std::FILE*>(stream)), '4');
+    std::fclose(static_cast<std::FILE*>(stream));
+    EXPECT_EQ(QvFile::flength(static_cast<void*>(nullptr)), -1);
+}
+
+TEST_P(FileUtil, FoldersAreMadeWithTheirParents) {
+    EXPECT_EQ(QvFile::mkpath(name("a/b//c/")), 0);
+    EXPECT_TRUE(QvFile::isDir(name("a/b/c")));
+    EXPECT_FALSE(QvFile::isFile(name("a/b/c")));
+    EXPECT_EQ(QvFile::mkpath(name("a/b/c")), 0);
+    EXPECT_EQ(QvFile::mkpath(GetParam()("")), 0);
+    temp.write("file", "");
+    EXPECT_EQ(QvFile::mkpath(name("file/x")), -1);
+    EXPECT_EQ(QvFile::mkpath(name("file")), -1);
+    EXPECT_EQ(QvFile::mkdir(name("d")), 0);
+    EXPECT_EQ(QvFile::mkdir(name("d")), -1);
+    EXPECT_EQ(QvFile::mkdir(name("no/d")), -1);
+}
+
+TEST_P(FileUtil, MovingLosesNothing) {
+    temp.write("from", "new");
+    temp.write("to", "old");
+    EXPECT_EQ(QvFile::mv(name("from"), name("to"), false), -1);
+    EXPECT_EQ(TempFolder::read(temp.file("to")), "old");
+    EXPECT_EQ(QvFile::mv(name("absent"), name("to"), true), -1);
+    EXPECT_EQ(TempFolder::read(temp.file("to")), "old");
+    EXPECT_EQ(QvFile::mv(name("to"), name("to"), true), 0);
+    EXPECT_EQ(TempFolder::read(temp.file("to")), "old");
+    EXPECT_EQ(QvFile::mv(name("from"), narrow(temp.file("to")), true), 0);
+    EXPECT_EQ(TempFolder::read(temp.file("to")), "new");
+    fs::create_directory(temp.file("folder"));
+    EXPECT_EQ(QvFile::mv(name("to"), name("folder"), true), -1);
+    EXPECT_EQ(QvFile::mv(name("to"), name("folder/inside"), false), 0);
+    EXPECT_EQ(TempFolder::read(temp.file("folder/inside")), "new");
+}
+
+TEST_P(FileUtil, ModificationIsLocalTimeToTheMicrosecond) {
+    temp.write("f", "");
+    const timespec times[2] = {{0, UTIME_OMIT}, {1'600'000'000, 123'456'789}};
+    ASSERT_EQ(utimensat(AT_FDCWD, temp.file("f").c_str(), times, 0), 0);
+    const std::time_t seconds = times[1].tv_sec;
+    const std::tm* const local = std::localtime(&seconds);
+    const QvDateTime expected(QvDate(local->tm_mday, local->tm_mon + 1, local->tm_year + 1900),
+                              QvTime(local->tm_hour, local->tm_min, local->tm_sec, 123, 456));
+    EXPECT_EQ(QvFile::lastModified(name("f")), expected);
+    EXPECT_EQ(QvFile::lastModified(name("absent")), QvDateTime());
+}
+
+TEST(FileUtilPlain, WhatIsNoTextFailsQuietly) {
+    EXPECT_FALSE(QvFile::isFile(Any()));
+    EXPECT_FALSE(QvFile::isDir(5));
+    EXPECT_EQ(QvFile::flength(Any(5)), -1);
+    EXPECT_EQ(QvFile::rm(5), -1);
+    EXPECT_EQ(QvFile::mkdir(Any()), -1);
+    EXPECT_EQ(QvFile::rmdir(Any("")), -1);
+    EXPECT_EQ(QvFile::mv("a", 5, true), -1);
+    EXPECT_EQ(execute_process(Any()), -1);
+    EXPECT_EQ(QvFile::ls(5, 0).size(), 0);
+}
+
+TEST(FileUtilPlain, CommandsTakeQuotedNamesOfBothWidths) {
+    const TempFolder temp;
+    const Any file = wide(temp.file("it's; exit 9"));
+    EXPECT_EQ(execute_process(Any::strcat("touch ", QvFile::shellQuote(file))), 0);
+    EXPECT_TRUE(QvFile::isFile(file));
+    EXPECT_EQ(execute_process("exit 7"), 7);
+}
+
+TEST(FileUtilPlain, PlacesHaveTheirSeparators) {
+    EXPECT_EQ(qv_os_name(QvFile::tempDir()).back(), '/');
+    EXPECT_TRUE(QvFile::isDir(QvFile::tempDir()));
+    EXPECT_TRUE(QvFile::isAbsolutePath(core_library_path()));
+    EXPECT_TRUE(QvFile::isFile(core_library_path()));
+}
+
+TEST(FileUtilPlain, DiscSpaceIsThePlatformsAnswer) {
+    FullDisc disc(77);
+    const PlatformScope scope(disc);
+    EXPECT_EQ(QvFile::freeSpace("/tmp/x"), 77);
+    EXPECT_EQ(QvFile::freeSpace(Any()), -1);
+}
+
+}  // namespace

@@ -1,0 +1,100 @@
+#include "core/engine/qvthreads.h"
+
+#include <gtest/gtest.h>
+
+#include <atomic>
+
+#include "tests/support/platform_scope.h"
+
+namespace {
+
+using namespace QVThreads;
+
+TEST(Threads, ASectionIsRecursiveAndExcludesOthers) {
+    QvCriticalSection section;
+    int counter = 0;
+    const auto count = [&] {
+        for (int i = 0; i < 10'000; ++i) {
+            const QvLock outer(&section);
+            const QvLock inner(&section);
+            ++counter;
+        }
+    };
+    QvThread other;
+    ASSERT_EQ(other.start(count), 0);
+    count();
+    other.wait();
+    EXPECT_EQ(counter, 20'000);
+}
+
+TEST(Threads, AnEventResetsItselfAndPostsDoNotAddUp) {
+    QvEvent event;
+    EXPECT_FALSE(event.wait(0));
+    event.post();
+    event.post();
+    EXPECT_TRUE(event.wait(0));
+    EXPECT_FALSE(event.wait(1));
+}
+
+TEST(Threads, AnEventHandsOverBothWays) {
+    QvEvent ping, pong;
+    int value = 0;
+    QvThread other;
+    ASSERT_EQ(other.start([&] {
+        for (int i = 0; i < 1000; ++i) {
+            ping.wait(-1);
+            ++value;
+            pong.post();
+        }
+    }),
+              0);
+    for (int i = 0; i < 1000; ++i) {
+        EXPECT_EQ(value, i);
+        ping.post();
+        EXPECT_TRUE(pong.wait(-1));
+    }
+}
+
+TEST(Threads, ASemaphoreCounts) {
+    QvSemaphore semaphore(1);
+    semaphore.post(2);
+    for (int i = 0; i < 3; ++i) EXPECT_TRUE(semaphore.wait(0));
+    EXPECT_FALSE(semaphore.wait(0));
+
+    std::atomic<int> taken{0};
+    {
+        QvThread a, b;
+        const auto take = [&] {
+            while (semaphore.wait(-1) && ++taken < 100) semaphore.post(2);
+        };
+        ASSERT_EQ(a.start(take), 0);
+        ASSERT_EQ(b.start(take), 0);
+        semaphore.post(2);
+    }
+    EXPECT_GE(taken, 100);
+}
+
+TEST(Threads, OneBodyAtATimeAndAgainAfterWaiting) {
+    QvThread thread;
+    QvEvent go;
+    ASSERT_EQ(thread.start([&] { go.wait(-1); }), 0);
+    EXPECT_EQ(thread.start([] {}), -1);
+    go.post();
+    thread.wait();
+    thread.wait();
+    bool ran = false;
+    EXPECT_EQ(thread.start([&] { ran = true; }), 0);
+    thread.wait();
+    EXPECT_TRUE(ran);
+}
+
+TEST(Threads, ASystemWithoutThreadsIsAFailedStart) {
+    NoThreads none;
+    const PlatformScope scope(none);
+    QvThread thread;
+    EXPECT_EQ(thread.start([] { FAIL(); }), -1);
+    thread.wait();
+    EXPECT_FALSE(thread.started());
+}
+
+}  // namespace

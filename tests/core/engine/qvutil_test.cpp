@@ -1,0 +1,227 @@
+#include "core/engine/qvutil.h"
+
+#include <gtest/gtest.h>
+
+#include <climits>
+#include <cmath>
+#include <string>
+
+#include "core/arch/widename.h"
+#include "core/engine/qvfileutil.h"
+#include "core/media/qvframerate.h"
+
+namespace {
+
+unsigned fcc(const char* text) {
+    unsigned value = 0;
+    for (int i = 3; i >= 0; --i) value = value << 8 | static_cast<unsigned char>(text[i]);
+    return value;
+}
+bool equal(const char* a, const char* b) { return QvUtil::equalFcc(fcc(a), fcc(b)); }
+bool exchangeable(const char* a, const char* b) {
+    return QvUtil::exchengeableFOURCC(static_cast<int>(fcc(a)), static_cast<int>(fcc(b)));
+}
+
+TEST(Util, FormatsThatStandForEachOther) {
+    EXPECT_TRUE(equal("BGRA", "BGR4") && equal("BGR4", "BGRA") && equal("YUYV", "YUY2") &&
+                equal("v210", "v210"));
+    EXPECT_FALSE(equal("BGRA", "ARGB") || equal("YUY2", "UYVY") || equal("I420", "YV12"));
+    EXPECT_TRUE(exchangeable("R32C", "ARGB") && exchangeable("UYVY", "YUY2") && exchangeable("YV12", "I420"));
+    EXPECT_FALSE(exchangeable("BGRA", "YUY2") || exchangeable("I420", "UYVY") ||
+                 exchangeable("v210", "v210"));
+}
+
+TEST(Util, PixelAspects) {
+    const struct {
+        double aspect;
+        int width, height;
+        bool broadcast;
+        int status, x, y;
+    } cases[] = {
+        {4.0 / 3, 720, 480, true, 0, 10, 11},
+        {16.0 / 9, 720, 480, true, 0, 40, 33},
+        {1.33335, 720, 576, true, 0, 12, 11},
+        {16.0 / 9, 720, 576, true, 0, 16, 11},
+        {16.0 / 9, 480, 272, true, 0, 1, 1},
+        {16.0 / 9, 480, 270, true, 0, 1, 1},
+        {4.0 / 3, 720, 576, false, 0, 16, 15},
+        {16.0 / 9, 1920, 1080, true, 0, 1, 1},
+        {16.0 / 9, 1920, 1088, true, 0, 136, 135},
+        {1.78, 1920, 1080, true, 0, 1, 1},
+        {0, 720, 576, true, 0, 1, 1},
+        {4.0 / 3, 0, 576, true, 0, 1, 1},
+        {1e300, 1, 1000, false, -1, 1, 1},
+    };
+    for (const auto& c : cases) {
+        int x = 9, y = 9;
+        EXPECT_EQ(QvUtil::getPixelAspect(&x, &y, c.aspect, c.width, c.height, c.broadcast), c.status);
+        EXPECT_EQ(std::make_pair(x, y), std::make_pair(c.x, c.y))
+            << c.width << "x" << c.height << " " << c.aspect;
+    }
+}
+
+TEST(Util, FrameAspectTurnsPixelAspectBack) {
+    for (const bool broadcast : {false, true}) {
+        for (const double aspect : {4.0 / 3, 16.0 / 9}) {
+            for (const auto& [width, height] : {std::pair{720, 480}, {720, 576}, {1440, 1080}, {480, 270}}) {
+                int x, y;
+                QvUtil::getPixelAspect(&x, &y, aspect, width, height, broadcast);
+                EXPECT_NEAR(QvUtil::getFrameAspect(x, y, width, height, broadcast), aspect, 1e-3);
+            }
+        }
+    }
+    EXPECT_EQ(QvUtil::getFrameAspect(24, 22, 720, 576, true), 4.0 / 3);  // 12:11, not reduced
+    EXPECT_EQ(QvUtil::getFrameAspect(0, 1, 720, 576, true), 0);
+    EXPECT_EQ(QvUtil::getFrameAspect(INT_MAX, 1, INT_MAX, 1, false), double(INT_MAX) * INT_MAX);
+}
+
+TEST(Util, ChannelsByNameAndByCount) {
+    const auto name = [](int channels, bool named) {
+        const AnyDict desc = QvUtil::channelDesc(channels, named);
+        EXPECT_EQ(desc.getInt32("value", -1), channels);
+        return std::string(desc.getString("name", ""));
+    };
+    EXPECT_EQ(name(1, true), "mono");
+    EXPECT_EQ(name(2, true), "stereo");
+    EXPECT_EQ(name(6, true), "6 channels");
+    EXPECT_EQ(name(1, false), "1 channel");
+    EXPECT_EQ(name(2, false), "2 channels");
+    EXPECT_EQ(name(0, false), "0 channels");
+}
+
+TEST(Util, ClosestPassesOverWhatIsNoNumber) {
+    double nearest = -1;
+    EXPECT_EQ(QvUtil::findClosestDouble(AnyVector("1", 10.0, 4, Any(7LL)), 6, &nearest), 3);
+    EXPECT_EQ(nearest, 7);
+    EXPECT_EQ(QvUtil::findClosestDouble(AnyVector(5.0, 7.0), 6, nullptr), 0);
+    EXPECT_EQ(QvUtil::findClosestDouble(AnyVector(std::nan(""), 7.0), 6, nullptr), 1);
+    EXPECT_EQ(QvUtil::findClosestDouble(AnyVector("a", "b"), 6, nullptr), -1);
+    EXPECT_EQ(QvUtil::findClosestDouble(AnyVector(), 6, nullptr), -1);
+}
+
+TEST(Util, EffectsSortByPositionAndKeepEqualOnesInOrder) {
+    const auto effect = [](const char* name, int position, int front, int on) {
+        return Any(AnyDict("name", name, "_position", position, "_front", front, "_on", on));
+    };
+    const AnyDict bare("name", "bare", "_on", 1);
+    AnyVector in(effect("b2", 2, 0, 1), effect("f1", 1, 1, 1), effect("off", 0, 0, 0), effect("b1", 1, 0, 1),
+                 bare, effect("b2x", 2, 0, 1), effect("fm", -3, 1, 1), 5);
+    AnyVector front("old"), back("old");
+    const auto names = [](const AnyVector& list) {
+        std::string all;
+        for (const Any& item : list) all += std::string(item.asDict().getString("name", "?")) + " ";
+        return all;
+    };
+    QvUtil::getSortedEffects(in, front, back, true);
+    EXPECT_EQ(names(front), "fm f1 ");
+    EXPECT_EQ(names(back), "bare b1 b2 b2x ");
+    EXPECT_EQ(back.at(0).asDict().getInt32("_position", -1), 0);
+    QvUtil::getSortedEffects(in, front, back, false);
+    EXPECT_EQ(names(back), "off bare b1 b2 b2x ");
+    QvUtil::getSortedEffects(in, in, back, false);
+    EXPECT_EQ(names(in), "fm f1 ");
+}
+
+TEST(Util, DigestsPrintWordsFromTheirLowByte) {
+    const auto digest = [](const Any& value, int chars = 32) {
+        const Any text = QvUtil::md5Digest(value, chars);
+        return text.isString() ? std::string(text.asString()) : "(invalid)";
+    };
+    // d41d8cd98f00b204e9800998ecf8427e, a word at a time; 04b2008f loses its zero.
+    EXPECT_EQ(digest(""), "d98c1dd44b2008f980980e97e42f8ec");
+    // 900150983cd24fb0d6963f7d28e17f72
+    const std::string abc = "98500190b04fd23c7d3f96d6727fe128";
+    EXPECT_EQ(digest("abc"), abc);
+    EXPECT_EQ(digest(u"abc"), abc);
+    EXPECT_EQ(digest(Any(static_cast<const void*>("abc"), 3)), abc);
+    EXPECT_EQ(digest("abc", 16), abc.substr(0, 16));
+    EXPECT_EQ(digest("abc", 11), "985001903c");
+    EXPECT_EQ(digest("abc", 1000), abc);
+    EXPECT_EQ(digest("abc", 1), "");
+    EXPECT_EQ(digest("abc", -5), "");
+    EXPECT_EQ(digest(u"\u00e9"), digest("\xC3\xA9"));
+    EXPECT_EQ(digest(5), "(invalid)");
+    EXPECT_EQ(digest(Any(static_cast<const void*>("abc"))), "(invalid)");
+}
+
+TEST(Util, FramesAndSamplesAreExactAtTheEndsOfTheirRanges) {
+    EXPECT_EQ(QvUtil::pts2FrameNr(27'000'000, 25, false), 25);
+    EXPECT_EQ(QvUtil::pts2FrameNr(27'000'000LL * 3600, 29.97, false), 107'892);
+    EXPECT_EQ(QvUtil::pts2FrameNr(26'999'999, 25, true), 24);
+    EXPECT_EQ(QvUtil::pts2FrameNr(LLONG_MAX, 100, false), static_cast<long long>(LLONG_MAX / 270'000));
+    EXPECT_EQ(QvUtil::pts2FrameNr(5, std::nan(""), false), 0);
+    const QvFramerate ntsc(QvRatio(30000, 1001));
+    EXPECT_EQ(QvUtil::samplesForFrames(1, ntsc, 48000), 1601);
+    EXPECT_EQ(QvUtil::samplesForFrames(5, ntsc, 48000), 8008);
+    EXPECT_EQ(QvUtil::samplesForFrames(INT_MAX, ntsc, 192000), 2147483647LL * 192000 * 1001 / 30000);
+    EXPECT_EQ(QvUtil::samplesForFrames(5, QvFramerate(QvRatio(0, 1)), 48000), 0);
+}
+
+TEST(Util, PositionsSplitAndPrint) {
+    char buffer[QvUtil::posSize];
+    QvUtil::printPos(buffer, 3'723'004);
+    EXPECT_STREQ(buffer, "1:02:03:004");
+    QvUtil::printPos(buffer, LLONG_MAX);
+    EXPECT_EQ(std::string(buffer).substr(0, 11), "2147483647:");
+    QvUtil::printPos(buffer, LLONG_MIN);
+    int h, m, s;
+    QvUtil::sec2hms(7325.9, h, m, s);
+    EXPECT_EQ(std::make_tuple(h, m, s), std::make_tuple(2, 2, 5));
+    QvUtil::sec2hms(std::nan(""), h, m, s);
+    EXPECT_EQ(std::make_tuple(h, m, s), std::make_tuple(0, 0, 0));
+}
+
+TEST(Util, MetaNamesAreNewAndInTheFoldersWidth) {
+    const Any name = QvUtil::makeMetaName("/tmp/x");
+    EXPECT_EQ(qv_os_name(name).rfind("/tmp/x/Tarsel_metadata_", 0), 0u);
+    EXPECT_NE(qv_os_name(name), qv_os_name(QvUtil::makeMetaName("/tmp/x")));
+    EXPECT_TRUE(QvUtil::makeMetaName(u"/tmp").isWString());
+}
+
+TEST(Util, CardFoldersComeParentsFirst) {
+    const AnyVector folders = QvUtil::getP2FolderStructure("/card/");
+    ASSERT_EQ(folders.size(), 7);
+    EXPECT_EQ(qv_os_name(folders.at(0)), "/card/CONTENTS");
+    EXPECT_EQ(qv_os_name(folders.at(2)), "/card/CONTENTS/VIDEO");
+    EXPECT_TRUE(QvUtil::getP2FolderStructure(u"/card").at(6).isWString());
+    EXPECT_EQ(QvUtil::getP2FolderStructure(5).size(), 0);
+}
+
+TEST(Util, ProfilesBySchemeAndCoding) {
+    EXPECT_TRUE(QvUtil::isProfile1(0x1000016) && !QvUtil::isProfile2(0x1000016));
+    EXPECT_TRUE(QvUtil::isProfile2(0x2160001) && !QvUtil::isProfile1(0x2160001));
+    EXPECT_FALSE(QvUtil::isProfile1(27) || QvUtil::isProfile2(27));
+    for (const int profile : {0x20E0002, 0x1000016}) EXPECT_TRUE(QvUtil::isExProfile(profile));
+    for (const int profile : {0x20F0002, 0x1000015, -1}) EXPECT_FALSE(QvUtil::isExProfile(profile));
+    for (const int profile : {0x100000A, 0x20E0001, 0x2040001, 0x2160009 + 1, 0x2030003})
+        EXPECT_TRUE(QvUtil::isMpeg2Profile(profile)) << profile;
+    for (const int profile : {0x1000001, 0x2160009, 0x2030001, 0x2030005, 0x2150000 + 0x1001, -1, 0})
+        EXPECT_FALSE(QvUtil::isMpeg2Profile(profile)) << profile;
+}
+
+TEST(Util, QualityWordsStayWithinTheirScale) {
+    EXPECT_STREQ(QvUtil::cqtQualityStr(0, 3), "Best");
+    EXPECT_STREQ(QvUtil::cqtQualityStr(9, 3), "Good");
+    EXPECT_STREQ(QvUtil::cqtQualityStr(-1, 4), "Highest");
+    EXPECT_STREQ(QvUtil::cqtQualityStr(2, 4), "Medium");
+    EXPECT_STREQ(QvUtil::cqtQualityStr(INT_MAX, 4), "Lowest");
+}
+
+TEST(Util, MacroblocksCountPartsWhole) {
+    EXPECT_EQ(QvUtil::macroblocks(1920, 1080), 120 * 68);
+    EXPECT_EQ(QvUtil::macroblocks(1, 17), 2);
+    EXPECT_EQ(QvUtil::macroblocks(0, 17), 0);
+    EXPECT_EQ(QvUtil::macroblocks(INT_MAX, INT_MAX), INT_MAX);
+}
+
+TEST(Util, TheMachineIsMeasured) {
+    const std::string cpu = QvUtil::cpuDescription().asString("");
+    EXPECT_EQ(cpu.rfind("Processors: ", 0), 0u);
+    EXPECT_NE(cpu.find(" Features: "), std::string::npos);
+#if defined(__x86_64__)
+    EXPECT_NE(cpu.find("SSE2"), std::string::npos);
+    EXPECT_NE(cpu.find("CMOV"), std::string::npos);
+#endif
+}
+
+}  // namespace
