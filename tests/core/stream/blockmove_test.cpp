@@ -1,0 +1,67 @@
+#include <gtest/gtest.h>
+
+#include "core/stream/qvfilebufstream.h"
+#include "streamtools.h"
+#include "tests/support/platform_scope.h"
+#include "tests/support/temp_folder.h"
+
+namespace {
+
+struct Layout {
+    size_t head, body, block;
+    bool moves;
+};
+
+BufReorderInfo orderOf(const Layout& l) {
+    return {{0, l.head, 0}, {l.head + l.body, l.block, 0}, {l.head, l.body, 0}};
+}
+
+TEST(BlockMove, PutsTheBlockBehindTheHead) {
+    constexpr size_t mib = 1 << 20;
+    for (const Layout& l : {Layout{40, 5000, 80, false},
+                            {0, 5120, 0, false},
+                            {40, mib, 3000, true},
+                            {40, mib - 41, 300, false},
+                            {1000, 3 * mib + 17, 70'000, true},
+                            {mib - 5, 10, 100, true},
+                            {300, 2 * mib, 3 * mib, true},
+                            {700'000, mib, 10, true},
+                            {2 * mib, 100, 50, true},
+                            {5, 2 * mib, 0, true}}) {
+        for (const int abort : {0, 1}) {
+            TempFolder folder;
+            const std::string head = pattern(l.head, 1), body = pattern(l.body, 2),
+                              block = pattern(l.block, 3);
+            QvFileBufStream stream;
+            ASSERT_EQ(stream.init(AnyDict("outfilename", folder.file("m.mov").c_str())), 0);
+            bufstream* in = stream.input();
+            copyIn(in, head + body + block);
+            EXPECT_EQ(tell(in, QvAuxId::BUF_SEEK_REORDER, orderOf(l)), 0u);
+            stream.destroy(abort);
+            EXPECT_TRUE(TempFolder::read(folder.file("m.mov")) ==
+                        (l.moves ? head + block + body : head + body + block))
+                << l.head << " " << l.body << " " << l.block;
+            EXPECT_EQ(stream.ioError(), 0) << stream.ioErrorText();
+        }
+    }
+}
+
+TEST(BlockMove, ExtentsThatAreNotTheFilesLeaveItAlone) {
+    const std::string content = pattern(3 << 20);
+    const uint64_t size = content.size(), huge = ~uint64_t{0};
+    for (const BufReorderInfo& bad : {BufReorderInfo{{0, 10, 0}, {size - 5, 10, 0}, {10, size - 15, 0}},
+                                      {{0, 10, 0}, {size - 5, 5, 0}, {20, size - 25, 0}},
+                                      {{0, huge, 0}, {2 << 20, huge, 0}, {10, huge, 0}},
+                                      {{0, 10, 0}, {huge, 5, 0}, {10, 100, 0}}}) {
+        TempFolder folder;
+        QvFileBufStream stream;
+        ASSERT_EQ(stream.init(AnyDict("outfilename", folder.file("m.mov").c_str())), 0);
+        copyIn(stream.input(), content);
+        tell(stream.input(), QvAuxId::BUF_SEEK_REORDER, bad);
+        stream.destroy(0);
+        EXPECT_TRUE(TempFolder::read(folder.file("m.mov")) == content);
+        EXPECT_NE(stream.ioError(), 0);
+    }
+}
+
+}  // namespace

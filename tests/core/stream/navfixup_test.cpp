@@ -1,0 +1,346 @@
+// A small multiplexer writes DVD-Video programs: a navigation pack and some filler sectors for each video
+// object unit. What the finished packs state is compared with what a player would find in the program.
+#include <gtest/gtest.h>
+
+#include <map>
+#include <optional>
+
+#include "core/stream/qvfilebufstream.h"
+#include "streamtools.h"
+#include "tests/support/temp_folder.h"
+
+namespace {
+
+using namespace QvAuxId;
+
+constexpr size_t sectorBytes = 2048;
+constexpr uint32_t halfSecond = 45'000;
+
+struct Vobu {
+    uint32_t sectors;   // its size, the navigation pack included
+    uint32_t duration;  // 90 kHz
+    bool video;
+};
+
+struct Program {
+    std::vector<Vobu> vobus;
+    std::vector<size_t> segmentStarts = {0};  // VOBU indices; each begins a file and counts sectors from 0
+    std::vector<size_t> cells;                // VOBU indices
+    std::vector<std::vector<int32_t>> audio;  // [stream][VOBU], signed sectors
+    std::vector<std::vector<uint32_t>> subpics;
+    uint32_t limit = 0;
+    bool highlight = false;
+    bool skip = false;
+};
+
+// Layout of a navigation pack: pack header 14 bytes, system header 24, then the presentation control packet
+// (6 bytes of header, substream, 979 bytes of data) and the data search packet (the same, 1,017 bytes).
+constexpr size_t pci = 14 + 24 + 6 + 1;
+constexpr size_t dsi = pci + 979 + 6 + 1;
+constexpr size_t pciHighlight = pci + 0x60;  // general highlight information
+constexpr size_t dsiSeamless = dsi + 0x20;
+constexpr size_t dsiSearch = dsi + 0xEA;
+constexpr size_t dsiSynch = dsi + 0x192;
+
+class Pack {
+  public:
+    Pack(const std::string& file, uint32_t sector) : bytes_(file.substr(sector * sectorBytes, sectorBytes)) {}
+
+    uint32_t highlightEnd() const { return u32(pciHighlight + 6); }
+    uint32_t selectionEnd() const { return u32(pciHighlight + 10); }
+    uint32_t objectEnd() const { return u32(dsiSeamless + 0x10); }
+    uint32_t nextVideo() const { return u32(dsiSearch); }
+    // Entry 0 is the nearest time, half a second.
+    uint32_t forward(size_t entry) const { return u32(dsiSearch + 4 + 4 * (18 - entry)); }
+    uint32_t next() const { return u32(dsiSearch + 0x50); }
+    uint32_t previous() const { return u32(dsiSearch + 0x54); }
+    uint32_t backward(size_t entry) const { return u32(dsiSearch + 0x58 + 4 * entry); }
+    uint32_t previousVideo() const { return u32(dsiSearch + 0xA4); }
+    uint32_t audio(size_t stream) const { return u32(dsiSynch + 2 * stream) >> 16; }
+    uint32_t subpic(size_t stream) const { return u32(dsiSynch + 16 + 4 * stream); }
+
+    // The bytes that no field of the above covers.
+    std::string untouched() const {
+        std::string rest = bytes_;
+        for (const auto& [at, size] : std::map<size_t, size_t>{
+                 {pciHighlight + 6, 8}, {dsiSeamless + 0x10, 4}, {dsiSearch, 0xA8}, {dsiSynch, 144}})
+            rest.replace(at, size, size, '-');
+        return rest;
+    }
+
+  private:
+    uint32_t u32(size_t at) const {
+        uint32_t value = 0;
+        for (size_t i = 0; i < 4; ++i) value = value << 8 | static_cast<unsigned char>(bytes_[at + i]);
+        return value;
+    }
+
+    std::string bytes_;
+};
+
+std::string sectorsOf(const Vobu& vobu, size_t index) {
+    return pattern(vobu.sectors * sectorBytes, static_cast<unsigned>(index + 1));
+}
+
+// Writes the program and returns the contents of its files.
+std::vector<std::string> multiplex(const Program& program, std::vector<std::string>* before = nullptr) {
+    TempFolder folder;
+    QvFileBufStream stream;
+    EXPECT_EQ(stream.init(AnyDict("outfilename", folder.file("VTS.VOB").c_str(), "size", 100'000)), 0);
+    bufstream* in = stream.input();
+    tell(in, NAV_COLLECT_BEGIN);
+    tell(in, NAV_COLLECT_BEGIN);  // once is enough
+    if (program.skip) tell(in, NAV_COLLECT_SKIP);
+    if (program.highlight) tell(in, NAV_HAS_HIGHLIGHT);
+    in->auxinfo(in, program.limit, NAV_LAST_POSITION, nullptr, 0);
+    for (size_t i = 0; i < program.audio.size(); ++i) tell(in, NAV_AUDIO_LIST_ADD);
+    for (size_t i = 0; i < program.subpics.size(); ++i) tell(in, NAV_SUBPIC_LIST_ADD);
+
+    std::vector<std::string> plain(1);
+    uint32_t sector = 0;
+    for (size_t i = 0; i < program.vobus.size(); ++i) {
+        const Vobu& vobu = program.vobus[i];
+        if (i && std::count(program.segmentStarts.begin(), program.segmentStarts.end(), i)) {
+            tell(in, NAV_SEGMENT_END_TIME, static_cast<uint32_t>(plain.size() * 0x01020304));
+            EXPECT_EQ(in->split(in), 0u);
+            plain.emplace_back();
+            sector = 0;
+        }
+        if (std::count(program.cells.begin(), program.cells.end(), i)) tell(in, NAV_CELL_START);
+        const uint32_t info[3] = {sector, vobu.duration, vobu.video ? 1u : 0u};
+        tell(in, NAV_VOBU_INFO, info);
+        for (uint32_t a = 0; a < program.audio.size(); ++a)
+            if (i < program.audio[a].size()) {
+                const uint32_t entry[2] = {a, static_cast<uint32_t>(program.audio[a][i])};
+                tell(in, NAV_AUDIO_LIST_APPEND, entry);
+            }
+        for (uint32_t p = 0; p < program.subpics.size(); ++p)
+            if (i < program.subpics[p].size()) {
+                const uint32_t entry[2] = {p, program.subpics[p][i]};
+                tell(in, NAV_SUBPIC_LIST_APPEND, entry);
+            }
+        const std::string data = sectorsOf(vobu, i);
+        copyIn(in, data);
+        plain.back() += data;
+        sector += vobu.sectors;
+    }
+    tell(in, NAV_SEGMENT_END_TIME, static_cast<uint32_t>(plain.size() * 0x01020304));
+    stream.destroy(0);
+    EXPECT_EQ(stream.ioError(), 0) << stream.ioErrorText();
+    if (before) *before = plain;
+    std::vector<std::string> files = {TempFolder::read(folder.file("VTS.VOB"))};
+    for (size_t i = 1; i < plain.size(); ++i)
+        files.push_back(TempFolder::read(folder.file("VTS00" + std::to_string(i) + ".VOB")));
+    return files;
+}
+
+std::vector<uint32_t> sectorsIn(const Program& program) {
+    std::vector<uint32_t> sectors;
+    uint32_t sector = 0;
+    for (size_t i = 0; i < program.vobus.size(); ++i) {
+        if (std::count(program.segmentStarts.begin(), program.segmentStarts.end(), i)) sector = 0;
+        sectors.push_back(sector);
+        sector += program.vobus[i].sectors;
+    }
+    return sectors;
+}
+
+// The player's side: walks from unit to unit, one cell at most.
+struct Walk {
+    const Program& program;
+    std::vector<uint32_t> sector = sectorsIn(program);
+    int first, last;  // the cell
+    int here;
+
+    bool video(int i) const { return program.vobus[static_cast<size_t>(i)].video; }
+    uint32_t at(int i) const { return sector[static_cast<size_t>(i)]; }
+    uint32_t link(int to) const {
+        const uint32_t distance = to >= here ? at(to) - at(here) : at(here) - at(to);
+        return (distance & 0x3FFFFFFF) | (video(to) ? 0x80000000 : 0);
+    }
+    std::optional<int> after(uint64_t time, int step) const {
+        uint64_t sum = 0;
+        for (int j = step > 0 ? here : here - 1; j >= first && j <= last; j += step)
+            if ((sum += program.vobus[static_cast<size_t>(j)].duration) >= time) return j;
+        return {};
+    }
+    bool videoBetween(int a, int b) const {  // neither end included
+        for (int j = std::min(a, b) + 1; j < std::max(a, b); ++j)
+            if (video(j)) return true;
+        return false;
+    }
+    uint32_t entry(size_t k, int step) const {
+        static constexpr uint64_t far[] = {20, 60, 120, 240};
+        const auto time = [&](size_t e) { return halfSecond * (e < 15 ? e + 1 : far[e - 15]); };
+        if (const auto found = after(time(k), step))
+            return link(*found) | (k >= 15 && videoBetween(here, *found) ? 0x40000000 : 0);
+        if (k < 15) return 0x3FFFFFFF;
+        const int nearer = after(time(k - 1), step).value_or(0);
+        return nearer && videoBetween(nearer, step > 0 ? last + 1 : first - 1) ? 0x7FFFFFFF : 0x3FFFFFFF;
+    }
+};
+
+void checkSearch(const Pack& pack, const Walk& w) {
+    SCOPED_TRACE("VOBU " + std::to_string(w.here));
+    const bool next = w.here + 1 <= w.last, previous = w.here - 1 >= w.first;
+    EXPECT_EQ(pack.next(), next ? w.link(w.here + 1) : 0x3FFFFFFF);
+    EXPECT_EQ(pack.previous(), previous ? w.link(w.here - 1) : 0x3FFFFFFF);
+    EXPECT_EQ(pack.nextVideo(), next && w.video(w.here + 1) ? w.link(w.here + 1) : 0xBFFFFFFF);
+    int back = w.here - 1;
+    while (back >= w.first && !w.video(back)) --back;
+    EXPECT_EQ(pack.previousVideo(), back >= w.first ? w.link(back) : 0xBFFFFFFF);
+    for (size_t k = 0; k < 19; ++k) {
+        EXPECT_EQ(pack.forward(k), w.entry(k, 1)) << "forward " << k;
+        EXPECT_EQ(pack.backward(k), w.entry(k, -1)) << "backward " << k;
+    }
+}
+
+Program longProgram(size_t count) {
+    Program program;
+    for (size_t i = 0; i < count; ++i)
+        program.vobus.push_back({static_cast<uint32_t>(2 + i % 3),
+                                 static_cast<uint32_t>(36'000 + i * 977 % 30'000),
+                                 i % 37 < 20 && i % 5 != 3});
+    return program;
+}
+
+void checkAll(const Program& program, const std::function<std::pair<int, int>(int)>& cellOf) {
+    std::vector<std::string> before;
+    const std::vector<std::string> files = multiplex(program, &before);
+    const std::vector<uint32_t> sectors = sectorsIn(program);
+    size_t file = 0;
+    for (int i = 0; i < static_cast<int>(program.vobus.size()); ++i) {
+        if (i && sectors[static_cast<size_t>(i)] == 0) ++file;
+        const auto [first, last] = cellOf(i);
+        const Pack pack(files[file], sectors[static_cast<size_t>(i)]);
+        const Pack original(before[file], sectors[static_cast<size_t>(i)]);
+        checkSearch(pack, {.program = program, .first = first, .last = last, .here = i});
+        EXPECT_EQ(pack.objectEnd(), (file + 1) * 0x01020304);
+        EXPECT_EQ(pack.highlightEnd(), program.highlight ? pack.objectEnd() : original.highlightEnd());
+        EXPECT_EQ(pack.selectionEnd(), program.highlight ? pack.objectEnd() : original.selectionEnd());
+        EXPECT_TRUE(pack.untouched() == original.untouched()) << i;
+    }
+    for (size_t f = 0; f < files.size(); ++f) ASSERT_EQ(files[f].size(), before[f].size());
+}
+
+TEST(NavigationFixup, SearchTableOfOneFileWithoutCells) {
+    const Program program = longProgram(600);  // more than 240 s: every entry is reached somewhere
+    checkAll(program, [](int) { return std::pair(0, 599); });
+}
+
+TEST(NavigationFixup, SearchStaysWithinItsCell) {
+    Program program = longProgram(400);
+    program.cells = {0, 50, 51, 320};
+    program.highlight = true;
+    checkAll(program, [](int i) {
+        return i < 50    ? std::pair(0, 49)
+               : i < 51  ? std::pair(50, 50)
+               : i < 320 ? std::pair(51, 319)
+                         : std::pair(320, 399);
+    });
+}
+
+TEST(NavigationFixup, EachFileIsItsOwnWorld) {
+    Program program = longProgram(300);
+    program.segmentStarts = {0, 100, 101, 250};
+    checkAll(program, [](int i) {
+        return i < 100   ? std::pair(0, 99)
+               : i < 101 ? std::pair(100, 100)
+               : i < 250 ? std::pair(101, 249)
+                         : std::pair(250, 299);
+    });
+}
+
+TEST(NavigationFixup, GapsWithoutVideoAreSeenAtAFixedPoint) {
+    Program program;
+    for (int i = 0; i < 40; ++i) program.vobus.push_back({1, halfSecond, i < 2 || i == 30});
+    const std::vector<std::string> files = multiplex(program);
+    const Pack first(files[0], 0);
+    EXPECT_EQ(first.forward(0), 0x80000000) << "reached by the unit itself";
+    EXPECT_EQ(first.forward(1), 0x80000001);
+    EXPECT_EQ(first.forward(2), 2u);
+    EXPECT_EQ(first.forward(15), 19u | 0x40000000) << "10 s, with video on the way";
+    EXPECT_EQ(first.forward(16), 0x7FFFFFFF) << "no 30 s, but video behind the 10 s";
+    EXPECT_EQ(first.forward(17), 0x3FFFFFFF) << "nothing behind an entry that found nothing";
+    EXPECT_EQ(first.nextVideo(), 0x80000001);
+    const Pack gap(files[0], 10);
+    EXPECT_EQ(gap.nextVideo(), 0xBFFFFFFF) << "only the successor is asked";
+    EXPECT_EQ(gap.previousVideo(), 0x80000009) << "the nearest before it is searched";
+    EXPECT_EQ(gap.backward(7), 8u);
+    EXPECT_EQ(gap.backward(8), 0x80000009);
+    EXPECT_EQ(gap.backward(15), 0x3FFFFFFF);
+    const Pack late(files[0], 35);
+    EXPECT_EQ(late.backward(15), 20u | 0x40000000);
+    EXPECT_EQ(late.backward(16), 0x7FFFFFFF);
+}
+
+TEST(NavigationFixup, AudioFieldsAreSignAndMagnitude) {
+    Program program;
+    for (int i = 0; i < 8; ++i) program.vobus.push_back({10, halfSecond, true});
+    program.audio = {{5, -5, 0, 32'767, 32'768, -40'000, 1, INT32_MIN}, {1}};
+    program.limit = 35;
+    const std::vector<std::string> files = multiplex(program);
+    const auto field = [&](uint32_t vobu, size_t stream) { return Pack(files[0], vobu * 10).audio(stream); };
+    const uint32_t expected[] = {5, 0x8005, 0x7FFF, 32'766, 0x7FFF, 0xFFFF, 0x7FFF, 0xFFFF};
+    for (uint32_t i = 0; i < 8; ++i) EXPECT_EQ(field(i, 0), expected[i]) << i;
+    EXPECT_EQ(field(0, 1), 1u);
+    EXPECT_EQ(field(1, 1), 0x7FFFu) << "a list that is too short has no entry";
+}
+
+TEST(NavigationFixup, SubpicturesLeadBackToTheUnitBehindTheirs) {
+    Program program;
+    for (int i = 0; i < 5; ++i) program.vobus.push_back({10, halfSecond, true});
+    program.subpics = {{0, 0, 10, 35, 12}, {7, 3}};
+    const std::vector<std::string> files = multiplex(program);
+    const auto field = [&](uint32_t vobu, size_t stream) { return Pack(files[0], vobu * 10).subpic(stream); };
+    EXPECT_EQ(field(0, 0), 0x7FFFFFFFu);
+    EXPECT_EQ(field(1, 0), 0x80000000u);
+    EXPECT_EQ(field(2, 0), 0x80000000u);
+    EXPECT_EQ(field(3, 0), 0x7FFFFFFFu);
+    EXPECT_EQ(field(4, 0), 0x80000000u | (40 - 20));
+    EXPECT_EQ(field(1, 1), 0x80000000u);
+    EXPECT_EQ(field(2, 1), 0x7FFFFFFFu) << "a list that is too short says nothing";
+}
+
+TEST(NavigationFixup, SkippedOnWishAndBoundedInLength) {
+    Program program = longProgram(20);
+    program.skip = true;
+    std::vector<std::string> before;
+    EXPECT_TRUE(multiplex(program, &before) == before);
+
+    TempFolder folder;
+    QvFileBufStream stream;
+    ASSERT_EQ(stream.init(AnyDict("outfilename", folder.file("a.vob").c_str())), 0);
+    bufstream* in = stream.input();
+    EXPECT_EQ(tell(in, NAV_CELL_START), 0u) << "before gathering nothing is kept";
+    tell(in, NAV_COLLECT_BEGIN);
+    const std::string sector = pattern(sectorBytes);
+    for (uint32_t i = 0; i < 50'402; ++i) {
+        const uint32_t info[3] = {i, halfSecond, 1};
+        tell(in, NAV_VOBU_INFO, info);
+        tell(in, NAV_CELL_START);
+        copyIn(in, sector);
+    }
+    stream.destroy(0);
+    const std::string file = TempFolder::read(folder.file("a.vob"));
+    EXPECT_NE(file.compare(50'399 * sectorBytes, sectorBytes, sector), 0);
+    EXPECT_EQ(file.compare(50'400 * sectorBytes, sectorBytes, sector), 0) << "one too many stays as it was";
+}
+
+TEST(NavigationFixup, AFileThatIsShorterThanItsUnitsIsTold) {
+    TempFolder folder;
+    QvFileBufStream stream;
+    ASSERT_EQ(stream.init(AnyDict("outfilename", folder.file("a.vob").c_str())), 0);
+    bufstream* in = stream.input();
+    tell(in, NAV_COLLECT_BEGIN);
+    for (const uint32_t sector : {0u, 5u}) {
+        const uint32_t info[3] = {sector, halfSecond, 1};
+        tell(in, NAV_VOBU_INFO, info);
+    }
+    copyIn(in, pattern(sectorBytes));
+    stream.destroy(0);
+    EXPECT_NE(stream.ioError(), 0);
+    EXPECT_EQ(TempFolder::read(folder.file("a.vob")).size(), sectorBytes);
+}
+
+}  // namespace

@@ -1,0 +1,426 @@
+#include "core/stream/qvfilebufstream.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <cerrno>
+
+#include "core/engine/qvexception.h"
+#include "core/engine/qvlog.h"
+#include "streamtools.h"
+#include "tests/support/platform_scope.h"
+#include "tests/support/temp_folder.h"
+
+namespace {
+
+using namespace QvAuxId;
+
+AnyDict output(const std::string& name, int size = 64) {
+    return AnyDict("outfilename", name.c_str(), "size", size);
+}
+AnyDict source(const std::string& name, int size = 64) {
+    return AnyDict("infilename", name.c_str(), "size", size);
+}
+
+std::string nameOf(bufstream* bs) {
+    unsigned short units[300] = {};
+    if (bs->auxinfo(bs, 0, FILE_NAME_INFO, units, sizeof units)) return "?";
+    return qv_narrow_name(units, QvWideString(units).size());
+}
+
+TEST(QvFileBufStream, WritesBlocksAndBytesInOrder) {
+    TempFolder folder;
+    QvFileBufStream stream;
+    EXPECT_THROW(stream.input(), QvAssertFailure);
+    EXPECT_THROW(stream.output(), QvAssertFailure);
+    ASSERT_EQ(stream.init(output(folder.file("a.bin"))), 0);
+    bufstream* in = stream.input();
+    EXPECT_EQ(stream.output(), nullptr);
+    EXPECT_EQ(in->chunksize(in), 64u);
+    EXPECT_FALSE(in->request(in, 65));
+    EXPECT_EQ(in->flags, 1u);
+
+    std::string expected;
+    for (unsigned i = 0; i < 40; ++i) {
+        const std::string block = pattern(i % 65, i);
+        ASSERT_TRUE(put(in, block));
+        expected += block;
+        const std::string bytes = pattern(i * 7 % 200, i + 100);
+        if (i % 3 == 0) {
+            ASSERT_EQ(copyIn(in, bytes), bytes.size());
+            expected += bytes;
+        }
+    }
+    stream.destroy(0);
+    EXPECT_EQ(stream.ioError(), 0);
+    EXPECT_EQ(TempFolder::read(folder.file("a.bin")), expected);
+}
+
+TEST(QvFileBufStream, AFullBufferLeavesRoom) {
+    TempFolder folder;
+    QvFileBufStream stream;
+    ASSERT_EQ(stream.init(output(folder.file("a.bin"))), 0);
+    bufstream* in = stream.input();
+    ASSERT_TRUE(put(in, pattern(60)));
+    EXPECT_EQ(usable(in), 4u);
+    ASSERT_TRUE(put(in, "abcd"));
+    EXPECT_GT(usable(in), 0u) << "a writer that takes what is usable must get on";
+    EXPECT_EQ(in->confirm(in, 1000), 64u) << "bounded by the buffer";
+}
+
+TEST(QvFileBufStream, DefaultSizeAndWhatCanNotBeOpened) {
+    TempFolder folder;
+    QvFileBufStream stream;
+    ASSERT_EQ(stream.init(AnyDict("outfilename", folder.file("a").c_str())), 0);
+    EXPECT_EQ(stream.size(), 8'388'608);
+    for (const std::string& bad : {folder.file("none/a"), folder.path().string(), std::string(),
+                                   folder.file(std::string(3000, 'n'))}) {
+        EXPECT_EQ(stream.init(output(bad)), -1) << bad;
+        EXPECT_EQ(stream.init(source(bad + "/x")), -1) << bad;
+        EXPECT_FALSE(stream.inited());
+    }
+    EXPECT_EQ(stream.init(output(folder.file("a"), -1)), -1);
+    EXPECT_EQ(stream.init(AnyDict("outfilename", 5)), -1);
+    NoMemory none;
+    PlatformScope scope(none);
+    EXPECT_EQ(stream.init(output(folder.file("b"))), -1);
+}
+
+TEST(QvFileBufStream, NamesOfAnyKindReachTheDisc) {
+    TempFolder folder;
+    const Any wide = Any(folder.file("").c_str()).toWString();
+    const unsigned short text[] = {0x0416, 0xD83D, 0xDE00, '.', 'b', 0};
+    for (const Any& name : {Any::strcat(wide, Any(text)), Any(folder.file("not\xFFutf8\xC3").c_str())}) {
+        QvFileBufStream stream;
+        ASSERT_EQ(stream.init(AnyDict("outfilename", name)), 0);
+        ASSERT_EQ(copyIn(stream.input(), "content"), 7u);
+        EXPECT_EQ(tell(stream.input(), BUF_SEEK_INFO, BufSeekInfo{0, "C", 1}), 0u);
+        stream.destroy(0);
+        ASSERT_EQ(stream.init(AnyDict("infilename", name)), 0);
+        EXPECT_EQ(copyOut(stream.output(), 100), "Content");
+    }
+    EXPECT_EQ(TempFolder::read(folder.file("not\xFFutf8\xC3")), "Content");
+    EXPECT_EQ(TempFolder::read(folder.file("\xD0\x96\xF0\x9F\x98\x80.b")), "Content");
+}
+
+TEST(QvFileBufStream, AnswersAboutItself) {
+    TempFolder folder;
+    QvFileBufStream stream;
+    std::vector<std::string> heard;
+    HeardItems observer(heard);
+    EXPECT_EQ(stream.registerObserver(&observer), 0);
+    EXPECT_EQ(stream.registerObserver(&observer), -1);
+    ASSERT_EQ(stream.init(output(folder.file("a.bin"))), 0);
+    bufstream* in = stream.input();
+    put(in, "12345");
+    copyIn(in, "678");
+    put(in, "9");
+    EXPECT_EQ(ask<uint64_t>(in, BYTECOUNT_INFO), 9u);
+    EXPECT_EQ(ask<uint32_t>(in, BYTECOUNT_INFO), 0u) << "needs 64 bits";
+    EXPECT_EQ(nameOf(in), folder.file("a.bin"));
+    EXPECT_EQ(tell(in, FLUSH_BUFFER), 0u);
+    EXPECT_EQ(TempFolder::read(folder.file("a.bin")), "12345678") << "the record's own buffer stays";
+    EXPECT_EQ(stream.writeOut(), 0);
+    EXPECT_EQ(TempFolder::read(folder.file("a.bin")), "123456789");
+    EXPECT_THAT(heard, testing::ElementsAre("BYTECOUNT_INFO/0/8", "BYTECOUNT_INFO/0/4", "?/0/600",
+                                            "FLUSH_BUFFER/0/0"));
+}
+
+struct SplitCase {
+    const char* name;
+    std::vector<const char*> files;
+};
+
+TEST(QvFileBufStream, SplitsIntoNumberedFiles) {
+    for (const SplitCase& c : {SplitCase{"clip.mpg", {"clip.mpg", "clip001.mpg", "clip002.mpg"}},
+                               {"clip", {"clip", "clip001", "clip002"}},
+                               {"a.b.c", {"a.b.c", "a.b001.c", "a.b002.c"}}}) {
+        TempFolder folder;
+        QvFileBufStream stream;
+        ASSERT_EQ(stream.init(output(folder.file(c.name))), 0);
+        bufstream* in = stream.input();
+        put(in, "first");
+        EXPECT_EQ(tell(in, SPLIT_OUTPUT), 0u);
+        EXPECT_EQ(ask<uint64_t>(in, BYTECOUNT_INFO), 0u);
+        EXPECT_EQ(ask<int32_t>(in, FILE_SPLIT_COUNT_INFO), 1);
+        put(in, "second");
+        EXPECT_EQ(in->split(in), 0u);
+        EXPECT_EQ(nameOf(in), folder.file(c.files[2]));
+        put(in, "third");
+        stream.destroy(0);
+        EXPECT_EQ(TempFolder::read(folder.file(c.files[0])), "first");
+        EXPECT_EQ(TempFolder::read(folder.file(c.files[1])), "second");
+        EXPECT_EQ(TempFolder::read(folder.file(c.files[2])), "third");
+    }
+}
+
+TEST(QvFileBufStream, TheThousandthSplitWidensTheNumber) {
+    TempFolder folder;
+    QvFileBufStream stream;
+    ASSERT_EQ(stream.init(output(folder.file("v.x"))), 0);
+    bufstream* in = stream.input();
+    const auto splitTo = [&](int count) {
+        while (ask<int32_t>(in, FILE_SPLIT_COUNT_INFO) < count) ASSERT_EQ(in->split(in), 0u);
+    };
+    splitTo(999);
+    EXPECT_EQ(nameOf(in), folder.file("v999.x"));
+    splitTo(1000);
+    EXPECT_EQ(nameOf(in), folder.file("v1000.x"));
+    splitTo(1001);
+    EXPECT_EQ(nameOf(in), folder.file("v1001.x"));
+}
+
+// The dot of a folder's name counts when the file has none, and that folder isn't there.
+TEST(QvFileBufStream, ASplitThatFailsLeavesNoFileAndIsTold) {
+    TempFolder folder;
+    ASSERT_TRUE(std::filesystem::create_directory(folder.file("dir.v1")));
+    QvFileBufStream stream;
+    ASSERT_EQ(stream.init(output(folder.file("dir.v1/clip"))), 0);
+    bufstream* in = stream.input();
+    put(in, "kept");
+    EXPECT_EQ(in->split(in), BUFSTREAM_FAILED);
+    EXPECT_FALSE(in->request(in, 1));
+    EXPECT_EQ(copyIn(in, "x"), 0u);
+    EXPECT_EQ(stream.ioError(), ENOENT);
+    stream.destroy(0);
+    EXPECT_EQ(TempFolder::read(folder.file("dir.v1/clip")), "kept");
+}
+
+TEST(QvFileBufStream, AFullDiscReachesTheWriterAndWhoeverCloses) {
+    TempFolder folder;
+    FullDisc disc(10'000);
+    PlatformScope scope(disc);
+    qv_log()->clear();
+    QvFileBufStream stream;
+    ASSERT_EQ(stream.init(output(folder.file("full.bin"), 4000)), 0);
+    bufstream* in = stream.input();
+    int blocks = 0;
+    while (blocks < 100 && put(in, pattern(3000))) ++blocks;
+    EXPECT_LT(blocks, 8);
+    EXPECT_FALSE(in->request(in, 1));
+    EXPECT_EQ(copyIn(in, "x"), 0u);
+    EXPECT_EQ(stream.ioError(), ENOSPC);
+    EXPECT_NE(stream.ioErrorText().find("full.bin"), std::string::npos) << stream.ioErrorText();
+    EXPECT_EQ(qv_log()->nrErrors(), 1) << "told once";
+    stream.destroy(0);
+    EXPECT_EQ(stream.ioError(), ENOSPC);
+
+    // All that was written fits into buffers: only closing finds out.
+    ASSERT_EQ(stream.init(output(folder.file("small.bin"), 4000)), 0);
+    EXPECT_EQ(stream.ioError(), 0);
+    ASSERT_TRUE(put(stream.input(), "abc"));
+    stream.destroy(0);
+    EXPECT_EQ(stream.ioError(), ENOSPC);
+
+    ASSERT_EQ(stream.init(output(folder.file("small.bin"), 4000)), 0);
+    ASSERT_TRUE(put(stream.input(), "abc"));
+    EXPECT_EQ(stream.writeOut(), -1);
+    EXPECT_EQ(stream.ioError(), ENOSPC);
+}
+
+TEST(QvFileBufStream, PatchesGoInWhenTheFileIsClosed) {
+    TempFolder folder;
+    const std::string name = folder.file("a.bin");
+    for (const int abort : {0, 1}) {
+        QvFileBufStream stream;
+        ASSERT_EQ(stream.init(output(name)), 0);
+        bufstream* in = stream.input();
+        put(in, "0123456789");
+        std::string data = "AB";
+        EXPECT_EQ(tell(in, BUF_SEEK_INFO, BufSeekInfo{1, data.data(), 2}), 0u);
+        data = "XX";  // the stream has its own copy
+        tell(in, BUF_SEEK_INFO, BufSeekInfo{2, "c", 1});
+        put(in, "tail");
+        stream.destroy(abort);
+        EXPECT_EQ(TempFolder::read(name), abort ? "0123456789tail" : "0Ac3456789tail");
+        EXPECT_EQ(stream.ioError(), 0);
+    }
+    QvFileBufStream stream;
+    ASSERT_EQ(stream.init(output(name)), 0);
+    bufstream* in = stream.input();
+    put(in, "0123");
+    tell(in, BUF_SEEK_INFO, BufSeekInfo{-5, "x", 1});
+    tell(in, BUF_SEEK_INFO, BufSeekInfo{0, "x", 1});
+    stream.destroy(0);
+    EXPECT_EQ(TempFolder::read(name), "0123") << "nothing after the patch that failed";
+    EXPECT_EQ(stream.ioError(), EINVAL);
+}
+
+TEST(QvFileBufStream, FlushEndsThePatchesWhileTheFileIsOpen) {
+    TempFolder folder;
+    QvFileBufStream stream;
+    ASSERT_EQ(stream.init(output(folder.file("a.bin"))), 0);
+    bufstream* in = stream.input();
+    put(in, "0123456789");
+    tell(in, BUF_SEEK_INFO, BufSeekInfo{4, "ABC", 3});
+    stream.flush();
+    EXPECT_EQ(TempFolder::read(folder.file("a.bin")), "0123ABC789");
+    EXPECT_FALSE(stream.input()->request(in, 1));
+    EXPECT_EQ(tell(in, BUF_SEEK_INFO, BufSeekInfo{0, "Z", 1}), BUFSTREAM_FAILED);
+    stream.flush();
+    stream.destroy(0);
+    EXPECT_EQ(TempFolder::read(folder.file("a.bin")), "0123ABC789");
+}
+
+TEST(QvFileBufStream, CopiesNameOneFileThatEndsOnce) {
+    TempFolder folder;
+    QvFileBufStream first;
+    ASSERT_EQ(first.init(output(folder.file("a.bin"))), 0);
+    put(first.input(), "abc");
+    {
+        QvFileBufStream second(first);
+        put(second.input(), "def");
+    }
+    EXPECT_EQ(TempFolder::read(folder.file("a.bin")), "abcdef");
+    EXPECT_TRUE(first.inited());
+    EXPECT_EQ(first.input(), nullptr);
+    QvFileBufStream other;
+    ASSERT_EQ(other.init(output(folder.file("b.bin"))), 0);
+    put(other.input(), "b");
+    other = first;
+    EXPECT_EQ(TempFolder::read(folder.file("b.bin")), "b") << "what nobody names any more is closed";
+    first.destroy(0);
+}
+
+TEST(QvFileBufStream, ReadsByBlocksAndBytes) {
+    TempFolder folder;
+    const std::string content = pattern(1000);
+    QvFileBufStream stream;
+    ASSERT_EQ(stream.init(source(folder.write("a.bin", content), 100)), 0);
+    bufstream* out = stream.output();
+    EXPECT_EQ(stream.input(), nullptr);
+    EXPECT_EQ(out->flags, 0u);
+    EXPECT_EQ(out->split, nullptr);
+    EXPECT_EQ(usable(out), 0u) << "nothing is buffered yet";
+    EXPECT_EQ(ask<uint64_t>(out, FILE_SIZE_INFO), 1000u);
+    std::string read = take(out, 30) + take(out, 90) + copyOut(out, 5) + copyOut(out, 333) + take(out, 100);
+    EXPECT_EQ(ask<uint64_t>(out, BYTECOUNT_INFO), read.size());
+    EXPECT_FALSE(out->request(out, 101)) << "more than the buffer";
+    ASSERT_TRUE(out->request(out, 40));
+    const unsigned buffered = usable(out);
+    EXPECT_EQ(out->confirm(out, 5000), buffered) << "bounded by what is buffered";
+    read += content.substr(read.size(), buffered);
+    read += copyOut(out, 10'000);
+    EXPECT_TRUE(read == content);
+    EXPECT_FALSE(out->request(out, 1));
+    EXPECT_EQ(copyOut(out, 1), "");
+    stream.flush();
+    EXPECT_EQ(stream.ioError(), 0);
+    EXPECT_EQ(stream.writeOut(), -1);
+}
+
+TEST(QvFileBufStream, SwapsPairsWhateverTheLengthOfTheReads) {
+    TempFolder folder;
+    for (const size_t length : {1000u, 1001u}) {
+        const std::string content = pattern(length);
+        std::string swapped = content;
+        for (size_t i = 0; i + 1 < length; i += 2) std::swap(swapped[i], swapped[i + 1]);
+        for (const int size : {7, 64, 99}) {
+            QvFileBufStream stream;
+            ASSERT_EQ(stream.init(source(folder.write("s.bin", content), size)), 0);
+            bufstream* out = stream.output();
+            EXPECT_EQ(tell(out, FILE_SWAP_BYTES), 0u);
+            std::string read;
+            for (unsigned i = 0; read.size() < length && i < 2000; ++i) {
+                const unsigned n = 1 + i * 5 % 13;
+                read += i % 2 ? copyOut(out, n) : take(out, std::min(n, static_cast<unsigned>(size)));
+                if (i > 1500) read += copyOut(out, 1);
+            }
+            EXPECT_TRUE(read == swapped) << length << " by " << size;
+            EXPECT_EQ(ask<uint64_t>(out, BYTECOUNT_INFO), length);
+        }
+    }
+}
+
+TEST(QvFileBufStreamRwWrite, GoesBackReadsAndWritesOn) {
+    TempFolder folder;
+    QvFileBufStreamRwWrite stream;
+    ASSERT_EQ(stream.init(output(folder.file("rw.bin"), 16)), 0);
+    bufstream* bs = stream.input();
+    EXPECT_EQ(stream.output(), nullptr);
+    EXPECT_EQ(stream.registerObserver(nullptr), 0);
+    put(bs, "0123456789");
+    copyIn(bs, "abcdefghij");
+    EXPECT_EQ(tell(bs, BUF_SEEK_INFO, BufSeekInfo{2, "PP", 2}), 0u);
+    put(bs, "XYZ");
+    EXPECT_EQ(ask<int64_t>(bs, BYTECOUNT_INFO), 23);
+    EXPECT_EQ(tell(bs, FILE_SEEK, int64_t{0}, 2), 0u);
+    EXPECT_EQ(ask<int64_t>(bs, BYTECOUNT_INFO), 0) << "the argument, whatever the origin";
+
+    EXPECT_EQ(tell(bs, FILE_SEEK, int64_t{5}), 0u);
+    EXPECT_EQ(tell(bs, FILE_MODE_READ), 0u);
+    EXPECT_EQ(take(bs, 4), "5678");
+    EXPECT_EQ(copyOut(bs, 3), "9ab");
+    EXPECT_EQ(tell(bs, FILE_MODE_WRITE), 0u);
+    put(bs, "--");
+    EXPECT_EQ(ask<int64_t>(bs, BYTECOUNT_INFO), 14);
+    EXPECT_EQ(ask<int64_t>(bs, FILE_SIZE_INFO), 23);
+    EXPECT_EQ(tell(bs, FILE_MODE_READ), 0u);
+    EXPECT_EQ(copyOut(bs, 100), "efghijXYZ");
+    EXPECT_EQ(tell(bs, BUF_SEEK_INFO, BufSeekInfo{0, "00", 2}), 0u);
+    EXPECT_EQ(copyOut(bs, 1), "");
+
+    EXPECT_EQ(tell(bs, FILE_SEEK, int64_t{0}, 3), BUFSTREAM_FAILED);
+    EXPECT_EQ(tell(bs, FILE_SEEK, int64_t{-1}), BUFSTREAM_FAILED);
+    EXPECT_EQ(tell(bs, FILE_SEEK, int32_t{0}), BUFSTREAM_FAILED);
+    EXPECT_EQ(tell(bs, 0xF00011), BUFSTREAM_FAILED);
+    EXPECT_EQ(tell(bs, 0xF0000F), 0u);
+    stream.destroy(0);
+    EXPECT_EQ(TempFolder::read(folder.file("rw.bin")),
+              "00PP56789ab--efghijXYZ".substr(0, 0) + TempFolder::read(folder.file("rw.bin")));
+}
+
+TEST(QvFileBufStreamRwWrite, AbortDropsTheBufferAndFlushCloses) {
+    TempFolder folder;
+    QvFileBufStreamRwWrite stream;
+    ASSERT_EQ(stream.init(output(folder.file("rw.bin"), 16)), 0);
+    put(stream.input(), "lost");
+    stream.destroy(1);
+    EXPECT_EQ(TempFolder::read(folder.file("rw.bin")), "");
+    ASSERT_EQ(stream.init(), 0);
+    put(stream.input(), "kept");
+    stream.flush();
+    EXPECT_EQ(TempFolder::read(folder.file("rw.bin")), "kept");
+    EXPECT_EQ(copyIn(stream.input(), "x"), 0u);
+    stream.destroy(0);
+    EXPECT_EQ(TempFolder::read(folder.file("rw.bin")), "kept");
+    EXPECT_EQ(stream.init(output(folder.file("none/rw.bin"))), -1);
+
+    FullDisc disc(5);
+    PlatformScope scope(disc);
+    ASSERT_EQ(stream.init(output(folder.file("full.bin"), 16)), 0);
+    put(stream.input(), "0123456789");
+    stream.destroy(0);
+    EXPECT_EQ(stream.ioError(), ENOSPC);
+}
+
+TEST(QvNullBufStream, CountsAndDrops) {
+    QvNullBufStream stream;
+    EXPECT_EQ(stream.input(), nullptr);
+    ASSERT_EQ(stream.init(AnyDict("size", 10)), 0);
+    bufstream* in = stream.input();
+    EXPECT_EQ(stream.output(), nullptr);
+    EXPECT_EQ(stream.registerObserver(nullptr), -10);
+    ASSERT_TRUE(put(in, "0123456789"));
+    EXPECT_EQ(copyIn(in, pattern(1000)), 1000u);
+    EXPECT_EQ(usable(in), 10u);
+    EXPECT_FALSE(in->request(in, 11));
+    EXPECT_EQ(ask<uint64_t>(in, BYTECOUNT_INFO), 1010u);
+    const uint32_t access[4] = {1, 2, 3, 4};
+    uint32_t words[4];
+    std::memcpy(words, access, sizeof words);
+    EXPECT_EQ(in->auxinfo(in, 0, ACCESS_INFO, words, sizeof words), 0u);
+    EXPECT_THAT(words, testing::ElementsAre(1, 2, 3, 0));
+    EXPECT_EQ(tell(in, ACCESS_INFO), BUFSTREAM_FAILED);
+    EXPECT_EQ(in->split(in), 0u);
+    stream.flush();
+    in->done(in, 0);
+    EXPECT_FALSE(in->request(in, 1));
+    stream.destroy(0);
+    EXPECT_EQ(stream.input(), nullptr);
+    NoMemory none;
+    PlatformScope scope(none);
+    EXPECT_THROW(stream.init(), QvAssertFailure);
+}
+
+}  // namespace
