@@ -56,7 +56,9 @@ class FullDisc : public QvPlatform {
         }
         const size_t taken = static_cast<long long>(size) < room ? size : static_cast<size_t>(room);
         room -= static_cast<long long>(taken);
-        return static_cast<ssize_t>(std::fwrite(from, 1, taken, stream(cookie).real));
+        const size_t done = std::fwrite(from, 1, taken, stream(cookie).real);
+        if (taken < size) errno = ENOSPC;  // the C library gives up at a short write
+        return static_cast<ssize_t>(done);
     }
     static int seekReal(void* cookie, off64_t* position, int origin) {
         if (fseeko64(stream(cookie).real, *position, origin) != 0) return -1;

@@ -34,7 +34,9 @@ void driveAgainstModel(unsigned size, unsigned chunk, int steps, unsigned seed) 
             case 0: {
                 const unsigned n = below(chunk + 2);
                 unsigned char* block = in->request(in, n);
-                if (n < usable(in) && n < chunk) ASSERT_TRUE(block) << "step " << step << " write " << n;
+                if (n < usable(in) && n < chunk) {
+                    ASSERT_TRUE(block) << "step " << step << " write " << n;
+                }
                 if (!block || n >= usable(in)) break;
                 const unsigned m = random() % 4 ? n : below(n);
                 for (unsigned i = 0; i < m; ++i) model.push_back(block[i] = next++);
@@ -51,8 +53,12 @@ void driveAgainstModel(unsigned size, unsigned chunk, int steps, unsigned seed) 
             case 2: {
                 const unsigned n = below(chunk);
                 const unsigned char* block = out->request(out, n);
-                if (n > model.size()) ASSERT_FALSE(block);
-                if (n <= model.size() && n < chunk) ASSERT_TRUE(block) << "step " << step << " read " << n;
+                if (n > model.size()) {
+                    ASSERT_FALSE(block);
+                }
+                if (n <= model.size() && n < chunk) {
+                    ASSERT_TRUE(block) << "step " << step << " read " << n;
+                }
                 if (!block) break;
                 ASSERT_TRUE(std::equal(block, block + n, model.begin())) << "step " << step;
                 const unsigned m = random() % 4 ? n : below(n);

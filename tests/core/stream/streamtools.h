@@ -43,9 +43,10 @@ inline std::string copyOut(bufstream* bs, unsigned n) {
 
 inline unsigned usable(bufstream* bs) { return bs->usable(bs); }
 
+// The value, which may be an array, is the info.
 template <class T>
-unsigned tell(bufstream* bs, unsigned id, T value, unsigned offset = 0) {
-    return bs->auxinfo(bs, offset, id, &value, sizeof value);
+unsigned tell(bufstream* bs, unsigned id, const T& value, unsigned offset = 0) {
+    return bs->auxinfo(bs, offset, id, const_cast<T*>(&value), sizeof value);
 }
 
 inline unsigned tell(bufstream* bs, unsigned id) { return bs->auxinfo(bs, 0, id, nullptr, 0); }

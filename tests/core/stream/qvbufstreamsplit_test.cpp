@@ -1,0 +1,353 @@
+#include "core/stream/qvbufstreamsplit.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <cerrno>
+
+#include "core/engine/qvexception.h"
+#include "core/engine/qvlog.h"
+#include "core/media/qvframe.h"
+#include "core/media/qvimage.h"
+#include "core/stream/wavheader_p.h"
+#include "streamtools.h"
+#include "tests/support/platform_scope.h"
+#include "tests/support/temp_folder.h"
+
+namespace {
+
+using namespace QvAuxId;
+
+void unit(QvBufStream& stream, unsigned id, std::string_view data) {
+    ASSERT_EQ(copyIn(stream.input(), data), data.size());
+    tell(stream.input(), id, static_cast<uint32_t>(data.size()));
+}
+
+AnyDict with(AnyDict params, const char* key, const Any& value) {
+    params.set(key, value);
+    return params;
+}
+
+std::vector<std::string> namesIn(const TempFolder& folder) {
+    std::vector<std::string> names;
+    for (const auto& entry : std::filesystem::directory_iterator(folder.path()))
+        names.push_back(entry.path().filename().string());
+    std::sort(names.begin(), names.end());
+    return names;
+}
+
+AnyDict pictures(const TempFolder& folder, const char* name = "clip.m2v") {
+    return AnyDict("outfilename", folder.file(name).c_str(), "size", 4096, "chunk", 513);
+}
+
+struct NameCase {
+    Any digits;
+    std::vector<std::string> names;
+};
+
+TEST(QvBsSplitVideo, EachUnitIsAFileWithANumber) {
+    for (const NameCase& c : {NameCase{Any(), {"clip#0.m2v", "clip#1.m2v"}},
+                              {4, {"clip#0000.m2v", "clip#0001.m2v"}},
+                              {"4", {"clip#0.m2v", "clip#1.m2v"}},
+                              {-3, {"clip#0.m2v", "clip#1.m2v"}}}) {
+        TempFolder folder;
+        QvBsSplitVideo stream;
+        ASSERT_EQ(stream.init(with(pictures(folder), "nrDigits", c.digits)), 0);
+        unit(stream, VIDEO_AU_CODE, pattern(2000, 1));  // larger than a chunk
+        unit(stream, VIDEO_AU_CODE, "");
+        stream.destroy(0);
+        EXPECT_EQ(namesIn(folder), c.names);
+        EXPECT_TRUE(TempFolder::read(folder.file(c.names[0])) == pattern(2000, 1));
+        EXPECT_EQ(TempFolder::read(folder.file(c.names[1])), "");
+    }
+}
+
+TEST(QvBsSplitVideo, UnitsRunOverTheEndOfTheRing) {
+    TempFolder folder;
+    QvBsSplitVideo stream;
+    ASSERT_EQ(stream.init(with(pictures(folder), "split", 1)), 0);
+    std::vector<std::string> heard;
+    HeardItems observer(heard);
+    EXPECT_EQ(stream.registerObserver(&observer), 0);
+    for (unsigned i = 0; i < 20; ++i) unit(stream, VIDEO_AU_CODE, pattern(1500 + i, i));
+    for (unsigned i = 0; i < 20; ++i)
+        EXPECT_TRUE(TempFolder::read(folder.file("clip#" + std::to_string(i) + ".m2v")) ==
+                    pattern(1500 + i, i));
+    EXPECT_EQ(heard.size(), 20u);
+    EXPECT_EQ(stream.unregisterObserver(&observer), 0);
+    EXPECT_EQ(stream.unregisterObserver(&observer), -1);
+}
+
+TEST(QvBsSplitVideo, PlainModeIsAFile) {
+    TempFolder folder;
+    QvBsSplitVideo stream;
+    EXPECT_THROW(stream.input(), QvAssertFailure);
+    std::vector<std::string> heard;
+    HeardItems observer(heard);
+    stream.registerObserver(&observer);
+    stream.setParam("outfilename", folder.file("all.m2v").c_str());
+    ASSERT_EQ(stream.init(AnyDict("split", 0)), 0);
+    unit(stream, VIDEO_AU_CODE, "one ");
+    unit(stream, VIDEO_AU_CODE, "two");
+    EXPECT_EQ(stream.output(), nullptr);
+    EXPECT_EQ(heard.size(), 2u);
+    EXPECT_EQ(stream.unregisterObserver(&observer), 0);
+    tell(stream.input(), SAMPLE_INFO);
+    EXPECT_EQ(heard.size(), 3u) << "the file goes on telling it";
+    stream.destroy(0);
+    EXPECT_EQ(TempFolder::read(folder.file("all.m2v")), "one two");
+    EXPECT_EQ(namesIn(folder), std::vector<std::string>{"all.m2v"});
+    EXPECT_EQ(stream.init(AnyDict("split", 0, "outfilename", folder.file("no/x").c_str())), -1);
+    EXPECT_FALSE(stream.inited());
+    EXPECT_NE(stream.ioError(), 0);
+}
+
+TEST(QvBsSplitVideo, FailuresStopTheRingAndUseUpANumber) {
+    TempFolder folder;
+    QvBsSplitVideo stream;
+    EXPECT_THROW(stream.init(AnyDict("outfilename", 5)), QvAssertFailure);
+    std::filesystem::create_directory(folder.file("clip#0.m2v"));
+    qv_log()->clear();
+    ASSERT_EQ(stream.init(pictures(folder)), 0);
+    unit(stream, VIDEO_AU_CODE, "abc");
+    AnyVector messages;
+    qv_log()->getAll(messages);
+    ASSERT_EQ(messages.size(), 2);
+    EXPECT_EQ(messages.at(0).asDict().get("text"),
+              ("[split writer] Failed to open " + folder.file("clip#0.m2v") + ".").c_str());
+    EXPECT_EQ(copyIn(stream.input(), "x"), 0u);
+    EXPECT_NE(stream.ioError(), 0);
+    tell(stream.input(), VIDEO_AU_CODE, 3u);
+    EXPECT_EQ(TempFolder::read(folder.file("clip#1.m2v")), "abc");
+    EXPECT_THROW(tell(stream.input(), VIDEO_AU_CODE), QvAssertFailure);
+    EXPECT_THROW(tell(stream.input(), VIDEO_AU_CODE, 1u), QvAssertFailure) << "nothing was written";
+
+    FullDisc disc(100);
+    PlatformScope scope(disc);
+    ASSERT_EQ(stream.init(pictures(folder)), 0);
+    EXPECT_EQ(stream.ioError(), 0);
+    std::filesystem::remove(folder.file("clip#0.m2v"));
+    unit(stream, VIDEO_AU_CODE, pattern(300));
+    EXPECT_EQ(stream.ioError(), ENOSPC);
+    EXPECT_FALSE(stream.input()->request(stream.input(), 1));
+}
+
+TEST(QvBsSplitVideo, PicturesBecomePng) {
+    TempFolder folder;
+    QvFrame picture;
+    ASSERT_EQ(picture.init(QvFourcc::BGR3, 30, 20), 0);
+    const auto bytes = static_cast<unsigned>(picture.total_bytes());
+    const std::string pixels = pattern(bytes);
+    AnyDict params("outfilename", folder.file("p.raw").c_str(), "size", 10'000, "chunk", 4000, "png", 1);
+    params.set("width", 30);
+    params.set("height", 20);
+    params.set("FOURCC", static_cast<int>(unsigned{QvFourcc::BGR3}));
+    QvBsSplitVideo stream;
+    ASSERT_EQ(stream.init(params), 0);
+    unit(stream, VIDEO_AU_CODE, pixels);
+    unit(stream, VIDEO_AU_CODE, pixels);
+    EXPECT_THAT(namesIn(folder), testing::ElementsAre("p#0.png", "p#1.png"));
+    ASSERT_EQ(QvImage::loadFrame(picture, folder.file("p#1.png").c_str()), 0);
+    for (int y = 0; y < 20; ++y)
+        for (int x = 0; x < 30; ++x) {
+            const size_t at = static_cast<size_t>(y) * ((3 * 30 + 3) / 4 * 4) + static_cast<size_t>(x) * 3;
+            ASSERT_EQ(std::memcmp(picture.pixelPtr(x, y, 0), pixels.data() + at, 3), 0) << x << "," << y;
+        }
+
+    ASSERT_EQ(copyIn(stream.input(), "short"), 5u);
+    tell(stream.input(), VIDEO_AU_CODE, 5u);
+    EXPECT_FALSE(stream.input()->request(stream.input(), 1)) << "a picture that is too short stops the ring";
+    ASSERT_EQ(stream.init(), 0);
+    EXPECT_THROW(unit(stream, VIDEO_AU_CODE, pattern(4000)), QvAssertFailure) << "larger than a chunk";
+}
+
+// --- WAV
+
+AnyDict wav(const TempFolder& folder, int rate, int channels, int bits, int split = 0) {
+    AnyDict params("outfilename", folder.file("take.wav").c_str(), "samplerate", rate, "channels", channels,
+                   "bitsPerSample", bits, "split", split, "size", 20'000, "chunk", 1001);
+    return params;
+}
+
+uint32_t le(const std::string& bytes, size_t at, size_t width) {
+    uint32_t value = 0;
+    for (size_t i = width; i-- > 0;) value = value << 8 | static_cast<unsigned char>(bytes[at + i]);
+    return value;
+}
+
+struct HeaderCase {
+    int rate, channels, bits;
+    uint32_t valueBytes, container;
+};
+
+TEST(QvBsSplitAudio, HeaderStatesTheStreamExactly) {
+    for (const HeaderCase& c : {HeaderCase{48'000, 2, 16, 2, 16},
+                                {44'100, 1, 8, 1, 8},
+                                {96'000, 6, 24, 3, 24},
+                                {48'000, 2, 20, 3, 24},
+                                {8'000, 33, 32, 4, 32}}) {
+        TempFolder folder;
+        QvBsSplitAudio stream;
+        ASSERT_EQ(stream.init(wav(folder, c.rate, c.channels, c.bits)), 0);
+        const auto channels = static_cast<uint32_t>(c.channels);
+        const std::string samples = pattern(c.valueBytes * channels * 100);
+        unit(stream, AUDIO_AU_CODE, std::string_view(samples).substr(0, 700));  // may end inside a sample
+        EXPECT_EQ(TempFolder::read(folder.file("take.wav")).substr(0, 80).find_first_not_of('\0'),
+                  std::string::npos);
+        unit(stream, AUDIO_AU_CODE, std::string_view(samples).substr(std::min<size_t>(700, samples.size())));
+        tell(stream.input(), STREAM_END_CODE);
+        stream.destroy(0);
+        const std::string file = TempFolder::read(folder.file("take.wav"));
+        ASSERT_TRUE(file.substr(80) == samples.substr(0, file.size() - 80));
+        ASSERT_EQ(file.size(), 80 + samples.size());
+        EXPECT_EQ(file.substr(0, 4), "RIFF");
+        EXPECT_EQ(le(file, 4, 4), file.size() - 8);
+        EXPECT_EQ(file.substr(8, 8), "WAVEfmt ");
+        EXPECT_EQ(le(file, 16, 4), 40u);
+        EXPECT_EQ(le(file, 20, 2), 0xFFFEu);
+        EXPECT_EQ(le(file, 22, 2), channels);
+        EXPECT_EQ(le(file, 24, 4), static_cast<uint32_t>(c.rate));
+        EXPECT_EQ(le(file, 28, 4), c.valueBytes * channels * static_cast<uint32_t>(c.rate));
+        EXPECT_EQ(le(file, 32, 2), c.valueBytes * channels);
+        EXPECT_EQ(le(file, 34, 2), c.container);
+        EXPECT_EQ(le(file, 36, 2), 22u);
+        EXPECT_EQ(le(file, 38, 2), static_cast<uint32_t>(c.bits));
+        EXPECT_EQ(le(file, 40, 4), 0u);
+        EXPECT_EQ(file.substr(44, 16), std::string("\x01\0\0\0\0\0\x10\0\x80\0\0\xAA\0\x38\x9B\x71", 16));
+        EXPECT_EQ(file.substr(60, 4), "fact");
+        EXPECT_EQ(le(file, 64, 4), 4u);
+        EXPECT_EQ(le(file, 68, 4), 100 * channels);
+        EXPECT_EQ(file.substr(72, 4), "data");
+        EXPECT_EQ(le(file, 76, 4), samples.size());
+        EXPECT_EQ(stream.ioError(), 0);
+    }
+}
+
+TEST(QvBsSplitAudio, EachChannelIsAMonoFile) {
+    for (const int bits : {8, 16, 20, 24, 32}) {
+        TempFolder folder;
+        QvBsSplitAudio stream;
+        ASSERT_EQ(stream.init(wav(folder, 100, 3, bits, 1)), 0);
+        const size_t width = static_cast<size_t>((bits + 7) / 8);
+        const std::string samples = pattern(width * 3 * 700);
+        for (size_t at = 0; at < samples.size();
+             at += 5000)  // units end inside samples, and hold above a second
+            unit(stream, AUDIO_AU_CODE, std::string_view(samples).substr(at, 5000));
+        tell(stream.input(), STREAM_END_CODE);
+        EXPECT_THAT(namesIn(folder), testing::ElementsAre("take#00.wav", "take#01.wav", "take#02.wav"));
+        for (size_t c = 0; c < 3; ++c) {
+            const std::string file = TempFolder::read(folder.file("take#0" + std::to_string(c) + ".wav"));
+            std::string channel;
+            for (size_t i = 0; i < 700; ++i) channel += samples.substr((i * 3 + c) * width, width);
+            ASSERT_TRUE(file.substr(80) == channel) << bits << " bits, channel " << c;
+            EXPECT_EQ(le(file, 22, 2), 1u);
+            EXPECT_EQ(le(file, 68, 4), 700u);
+        }
+        EXPECT_EQ(stream.ioError(), 0);
+        EXPECT_EQ(copyIn(stream.input(), "abc"), 3u);
+        tell(stream.input(), AUDIO_AU_CODE, 3u);
+        EXPECT_FALSE(stream.input()->request(stream.input(), 1)) << "nothing goes in behind the end";
+    }
+}
+
+TEST(QvBsSplitAudio, AStreamThatEndsInsideASampleIsTold) {
+    TempFolder folder;
+    QvBsSplitAudio stream;
+    ASSERT_EQ(stream.init(wav(folder, 48'000, 2, 16)), 0);
+    unit(stream, AUDIO_AU_CODE, "0123456789");
+    qv_log()->clear();
+    tell(stream.input(), STREAM_END_CODE);
+    EXPECT_EQ(qv_log()->nrWarnings(), 1);
+    const std::string file = TempFolder::read(folder.file("take.wav"));
+    EXPECT_EQ(file.substr(80), "01234567");
+    EXPECT_EQ(le(file, 76, 4), 8u);
+}
+
+TEST(QvBsSplitAudio, RefusesWhatNoWavCanHold) {
+    TempFolder folder;
+    QvBsSplitAudio stream;
+    for (const auto& [rate, channels, bits, split] : {std::tuple{0, 2, 16, 0},
+                                                      {-1, 2, 16, 0},
+                                                      {48'000, 0, 16, 0},
+                                                      {48'000, -2, 16, 0},
+                                                      {48'000, 2, 0, 0},
+                                                      {48'000, 2, 33, 0},
+                                                      {48'000, 70'000, 16, 0},
+                                                      {48'000, 33, 16, 1},
+                                                      {48'000, 2, -8, 1}}) {
+        EXPECT_EQ(stream.init(wav(folder, rate, channels, bits, split)), -1)
+            << rate << channels << bits << split;
+        EXPECT_FALSE(stream.inited());
+    }
+    EXPECT_TRUE(namesIn(folder).empty());
+    EXPECT_EQ(stream.init(with(wav(folder, 48'000, 2, 16), "outfilename", folder.file("no/a.wav").c_str())),
+              -1);
+    EXPECT_NE(stream.ioError(), 0);
+    EXPECT_EQ(stream.init(with(wav(folder, 48'000, 2, 16, 1), "outfilename", 7)), -1);
+    FullDisc disc(50);
+    PlatformScope scope(disc);
+    qv_log()->clear();
+    EXPECT_EQ(stream.init(wav(folder, 48'000, 2, 16)), -1);
+    EXPECT_EQ(stream.ioError(), ENOSPC);
+    EXPECT_EQ(qv_log()->nrErrors(), 1);
+}
+
+TEST(QvBsSplitAudio, AFullDiscStopsTheRing) {
+    for (const int split : {0, 1}) {
+        TempFolder folder;
+        FullDisc disc(30'000);
+        PlatformScope scope(disc);
+        QvBsSplitAudio stream;
+        ASSERT_EQ(stream.init(wav(folder, 1000, 2, 16, split)), 0);
+        int units = 0;
+        while (units < 100 && stream.input()->request(stream.input(), 1)) {
+            unit(stream, AUDIO_AU_CODE, pattern(4000));
+            ++units;
+        }
+        EXPECT_LT(units, 12);
+        EXPECT_EQ(stream.ioError(), ENOSPC);
+    }
+}
+
+TEST(QvBsSplitAudio, PlainModeIsAFile) {
+    TempFolder folder;
+    QvBsSplitAudio stream;
+    ASSERT_EQ(stream.init(with(wav(folder, 48'000, 2, 16), "isPcm", 0)), 0);
+    unit(stream, AUDIO_AU_CODE, "compressed");
+    tell(stream.input(), STREAM_END_CODE);
+    stream.flush();
+    stream.destroy(0);
+    EXPECT_EQ(TempFolder::read(folder.file("take.wav")), "compressed");
+}
+
+TEST(WavHeader, SizesBeyondFourGibAreTheLargestAndTold) {
+    const WavFormat stereo = {48'000, 2, 16};
+    const auto field = [&](uint64_t fileBytes, size_t at) {
+        const auto header = wavHeader(stereo, fileBytes);
+        return le(std::string(header.begin(), header.end()), at, 4);
+    };
+    constexpr uint64_t most = 0xFFFFFFFF;
+    EXPECT_EQ(field(most + 8, 4), most);
+    EXPECT_EQ(field(most + 8, 76), most + 8 - 80);
+    EXPECT_EQ(field(most + 9, 4), most);
+    EXPECT_EQ(field(most + 81, 76), most);
+    EXPECT_EQ(field(most * 2 + 2 + 80, 68), most);
+
+    TempFolder folder;  // a hole of 5 GiB takes no room on the disc
+    const std::string name = folder.write("big.wav", "");
+    std::filesystem::resize_file(name, 5ull << 30);
+    QvIoFailure failure;
+    qv_log()->clear();
+    ASSERT_TRUE(writeWavHeader(qv_wide_name(name), stereo, failure));
+    EXPECT_EQ(qv_log()->nrWarnings(), 1);
+    EXPECT_EQ(std::filesystem::file_size(name), 5ull << 30);
+    std::ifstream in(name, std::ios::binary);
+    std::string header(80, '\0');
+    in.read(header.data(), 80);
+    EXPECT_EQ(le(header, 4, 4), most);
+    EXPECT_EQ(le(header, 76, 4), most);
+    EXPECT_FALSE(writeWavHeader(qv_wide_name(folder.file("none.wav")), stereo, failure));
+    EXPECT_EQ(failure.code(), ENOENT);
+}
+
+}  // namespace
