@@ -1,6 +1,8 @@
 #include "builtin/encoders/rawvenc.h"
 
+#include <algorithm>
 #include <climits>
+#include <cstring>
 #include <mutex>
 #include <system_error>
 
@@ -20,7 +22,34 @@ namespace {
 constexpr int queuedFrames = 3;
 constexpr unsigned announcedInfoBytes = 32;
 
+// All rows of a plane, the part of one included that an odd height leaves at the end of the chroma.
+void copyPlane(QvFrame& to, const QvFrame& from, int plane) {
+    const int toStride = to.stride(plane);
+    const int fromStride = from.stride(plane);
+    const auto row = static_cast<size_t>(std::min(toStride, fromStride));
+    int rows = to.plane_bytes(plane) / toStride;
+    unsigned char* target = to.plane(plane);
+    const unsigned char* source = from.plane(plane);
+    for (; rows > 0; --rows, target += toStride, source += fromStride) std::memcpy(target, source, row);
+    std::memcpy(target, source, static_cast<size_t>(to.plane_bytes(plane) % toStride));
+}
+
+// Into a frame with the default strides. Unlike a frame's own assignment this takes every row of I422, and no
+// metadata.
+int copyPacked(QvFrame& to, const QvFrame& from) {
+    if (to.four_cc() != from.four_cc() || to.width() != from.width() || to.height() != from.height() ||
+        !to.inited())
+        if (const int result = to.init(from.four_cc(), from.width(), from.height())) return result;
+    if (to.total_bytes() == from.total_bytes())
+        std::memcpy(to.plane(), from.plane(), static_cast<size_t>(to.total_bytes()));
+    else
+        for (int plane = 0; plane < to.planes(); ++plane) copyPlane(to, from, plane);
+    return QvStatus::ok;
+}
+
 }  // namespace
+
+RawVideoEnc::RawVideoEnc() = default;
 
 RawVideoEnc::~RawVideoEnc() {
     if (getState() == qvStateOpen) finish(true);
@@ -39,12 +68,14 @@ int RawVideoEnc::remake(int width, int height, unsigned type) {
     const long long bytes = rawvenc::frameBytesBound(width, height);
     if (width < 1 || height < 1 || bytes > INT_MAX / 2)
         return setError(QvStatus::invalidParam, "Invalid frame size %dx%d", width, height);
-    if (picture_.init(type == QvFourcc::v210 ? QvFourcc::Y216 : type, width, height) != 0)
-        return setError(QvStatus::outOfMemory, "Out of memory for a frame of %dx%d", width, height);
+    unsigned char place = 0;  // for the shape alone: nothing is allocated or touched
+    QvFrame shape;
+    if (shape.init(type == QvFourcc::v210 ? QvFourcc::Y216 : type, width, height, &place) != 0)
+        return setError(QvStatus::invalidParam, "Invalid frame size %dx%d", width, height);
     width_ = width;
     height_ = height;
     type_ = type;
-    frameBytes_ = type == QvFourcc::v210 ? rawvenc::v210Bytes(width, height) : picture_.total_bytes();
+    frameBytes_ = type == QvFourcc::v210 ? rawvenc::v210Bytes(width, height) : shape.total_bytes();
     havePicture_ = false;
     return QvStatus::ok;
 }
@@ -89,7 +120,8 @@ int RawVideoEnc::writeFrame(QvFrame* frame) {
                         frame->planes() > 0 ? frame->width(0) : 0, frame->planes() > 0 ? frame->height(0) : 0,
                         frame->planes() > 0 ? frame->str_four_cc() : "no format", width_, height_);
     if (getOut_) {
-        picture_ = *frame;
+        if (const int result = copyPacked(picture_, *frame)) return setError(result, "Out of memory");
+        picture_.copyMeta(*frame);
         havePicture_ = true;
     }
     if (worker_.joinable()) return enqueue(*frame);
@@ -105,8 +137,8 @@ RawVideoEnc::Outcome RawVideoEnc::writeOut(const QvFrame& frame) {
         return writePicture(*picture, frame.total_bytes());
     }
     if (isPacked(frame)) return writePicture(frame, frame.total_bytes());
-    picture_ = frame;
-    return writePicture(picture_, picture_.total_bytes());
+    if (const int result = copyPacked(packed_, frame)) return {result, false, 0, "Out of memory"};
+    return writePicture(packed_, packed_.total_bytes());
 }
 
 // An output that takes access units apart needs the bytes that it was given; for others the announced count
@@ -169,8 +201,9 @@ int RawVideoEnc::enqueue(const QvFrame& frame) {
     if (failure_.status != 0) return report(failure_);
     QvFrame* slot = queue_.emptyBuffer();  // stays at the head: the worker only appends
     lock.unlock();
-    *slot = frame;
+    const int copied = copyPacked(*slot, frame);
     lock.lock();
+    if (copied != QvStatus::ok) return setError(copied, "Out of memory");
     queue_.moveToFull();
     workReady_.notify_one();
     return QvStatus::ok;
@@ -221,6 +254,7 @@ int RawVideoEnc::finish(bool discard) {
     }
     converter_.reset();
     picture_.destroy();
+    packed_.destroy();
     havePicture_ = false;
     setState(stateInitialised);
     return result;

@@ -23,7 +23,7 @@ class QvVideoFilter;
 // close.
 class RawVideoEnc : public QvVideoEncoder {
   public:
-    RawVideoEnc() = default;
+    RawVideoEnc();
     ~RawVideoEnc() override;
 
     int init() override;
@@ -75,7 +75,8 @@ class RawVideoEnc : public QvVideoEncoder {
     int frameBytes_ = 0;  // of one packed frame, v210 as it is put out
     QvFramerate rate_{25.0};
     int profile_ = 0x1000065;
-    QvFrame picture_;
+    QvFrame picture_;  // the latest frame, while it is kept
+    QvFrame packed_;   // of a frame with padding; the worker's while there is one
     bool havePicture_ = false;
     bool getOut_ = false;
     bool accelerated_ = false;

@@ -107,6 +107,7 @@ class EncodePipe2 : public QvEncodePipe, public QvIProgramSetup {
     int finishEncoders(bool aborting);
     int finishMuxer(bool aborting);
     int finishSink(bool aborting);
+    void tellUser(const std::string& reason);
 
     // --- Streams
     int refuseWhileOpen();

@@ -24,13 +24,16 @@ bool isModule(const QvCodec* codec, const char* name) {
     return codec && std::strcmp(codec->name(), name) == 0;
 }
 
-// Runs one step of finishing. A broken contract in one member must not leave the others open.
+// Runs one step of finishing and gives its reason when it fails. A broken contract in one member must not
+// leave the others open.
 template <class Step>
-int finishing(const char* who, Step step) {
+int finishing(const QvCodec& member, std::string& reason, Step step) {
     try {
-        return step();
+        const int result = step();
+        if (result != QvStatus::ok) reason = member.errorDesc();
+        return result;
     } catch (const QvException& failure) {
-        qv_dbg()->error("%s: %s", who, failure.what());
+        reason = failure.what();
         return QvStatus::failed;
     }
 }
@@ -174,34 +177,40 @@ int EncodePipe2::finishEncoders(bool aborting) {
         const int at = place++;
         auto* encoder = stream->encoder;
         if (!encoder) continue;
+        std::string reason;
         const int result =
-            finishing(encoder->name(), [&] { return aborting ? encoder->abort() : encoder->close(); });
+            finishing(*encoder, reason, [&] { return aborting ? encoder->abort() : encoder->close(); });
         if (result == QvStatus::ok) continue;
         qv_dbg()->error("EncodePipe.%s: error (%d) at stream %s #%d (%s)", aborting ? "abort" : "close",
                         result, qvStreamTypeName(stream->type), at, encoder->name());
-        takeError(*encoder, result);
+        setError(result, "%s", reason.c_str());
         all |= result;
     }
     return all;
 }
 
-// The user's log gets the member's own reason too.
 int EncodePipe2::finishMuxer(bool aborting) {
+    std::string reason;
     const int result =
-        finishing(muxer_->name(), [&] { return aborting ? muxer_->abort() : muxer_->close(); });
+        finishing(*muxer_, reason, [&] { return aborting ? muxer_->abort() : muxer_->close(); });
     if (result == QvStatus::ok) return result;
     setError(QvStatus::failed, aborting ? "Aborting muxer '%s' failed." : "Closing muxer '%s' failed.",
              muxer_->displayName());
-    qv_log()->error("%s", errorDesc());
-    if (*muxer_->errorDesc()) qv_log()->error("%s", muxer_->errorDesc());
+    tellUser(reason);
     return result;
 }
 
 int EncodePipe2::finishSink(bool aborting) {
-    const int result = finishing(sink_->name(), [&] { return aborting ? sink_->abort() : sink_->close(); });
+    std::string reason;
+    const int result = finishing(*sink_, reason, [&] { return aborting ? sink_->abort() : sink_->close(); });
     if (result == QvStatus::ok) return result;
     setError(QvStatus::failed, "%s", aborting ? "Aborting sink failed." : "Closing sink failed.");
-    qv_log()->error("%s", errorDesc());
-    if (*sink_->errorDesc()) qv_log()->error("%s", sink_->errorDesc());
+    tellUser(reason);
     return result;
+}
+
+// The pipe's text says who failed; why is in a message of its own.
+void EncodePipe2::tellUser(const std::string& reason) {
+    qv_log()->error("%s", errorDesc());
+    if (!reason.empty()) qv_log()->error("%s", reason.c_str());
 }

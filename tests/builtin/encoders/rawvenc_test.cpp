@@ -1,0 +1,281 @@
+#include "builtin/encoders/rawvenc.h"
+
+#include <gtest/gtest.h>
+
+#include <future>
+#include <memory>
+
+#include "builtin/encoders/rawoutput.h"
+#include "builtin/modules.h"
+#include "core/engine/qvexception.h"
+#include "core/media/qvgeometry.h"
+#include "core/stream/auxinfoid.h"
+#include "tests/support/log_capture.h"
+#include "tests/support/pictures.h"
+#include "tests/support/test_stream.h"
+
+namespace {
+
+class RawVideo : public testing::Test {
+  protected:
+    RawVideo() { enc().init(); }
+    ~RawVideo() override { enc_.reset(); }
+
+    RawVideoEnc& enc() { return *enc_; }
+    void format(unsigned type, int width, int height) {
+        ASSERT_EQ(enc().setParam("type", static_cast<int>(type)), 0);
+        ASSERT_EQ(enc().setParam("width", width), 0);
+        ASSERT_EQ(enc().setParam("height", height), 0);
+    }
+    void start() {
+        ASSERT_EQ(enc().attachOutStream(&out_), 0);
+        ASSERT_EQ(enc().open(), 0);
+    }
+    int number(const char* name) { return static_cast<QvCodec&>(enc()).getParam(name).toInt32(); }
+
+    RawVideoEncoderModule module_;
+    TestStream out_;
+    std::unique_ptr<RawVideoEnc> enc_{static_cast<RawVideoEnc*>(module_.create())};
+};
+
+struct Layout {
+    const char* type;
+    int width, height, bytes;
+};
+
+void PrintTo(const Layout& layout, std::ostream* out) { *out << layout.type; }
+
+class RawVideoLayout : public RawVideo, public testing::WithParamInterface<Layout> {
+  protected:
+    unsigned type() const {
+        const char* c = GetParam().type;
+        return qvFourcc({c[0], c[1], c[2], c[3], 0});
+    }
+};
+
+// Sizes that give odd strides and padding, so that a lost or doubled byte shows.
+INSTANTIATE_TEST_SUITE_P(Types, RawVideoLayout,
+                         testing::Values(Layout{"BGR3", 33, 5, 100 * 5}, Layout{"BGR4", 33, 5, 660},
+                                         Layout{"I420", 34, 6, 306}, Layout{"YV12", 34, 6, 306},
+                                         Layout{"I422", 34, 6, 408}, Layout{"W016", 34, 6, 612},
+                                         Layout{"YUYV", 34, 5, 340}, Layout{"YUY2", 34, 5, 340},
+                                         Layout{"UYVY", 34, 5, 340}, Layout{"Y216", 34, 5, 680},
+                                         Layout{"b64a", 33, 5, 1320}, Layout{"GRAY", 33, 5, 180}));
+
+TEST_P(RawVideoLayout, PutsOutThePlanesAndAnnouncesThem) {
+    const auto& layout = GetParam();
+    format(type(), layout.width, layout.height);
+    EXPECT_EQ(number("_outFrameSize"), layout.bytes);
+    EXPECT_EQ(number("dstBuffSize"), layout.bytes + 10);
+    for (const int accelerated : {0, 1}) {
+        SCOPED_TRACE(accelerated);
+        out_.data.clear();
+        out_.units.clear();
+        ASSERT_EQ(enc().setParam("accelerationOn", accelerated), 0);
+        start();
+        std::string expected;
+        for (unsigned seed = 1; seed <= 7; ++seed) {
+            QvFrame frame = makePicture(type(), layout.width, layout.height, seed);
+            expected += pictureBytes(frame);
+            ASSERT_EQ(enc().writeFrame(&frame), 0);
+            fillPicture(frame, 99);  // the buffer is the caller's again
+        }
+        ASSERT_EQ(enc().close(), 0);
+        EXPECT_TRUE(out_.data == expected);
+        const TestStream::Unit unit{QvAuxId::VIDEO_AU_CODE, static_cast<unsigned>(layout.bytes), 32};
+        EXPECT_EQ(out_.units, std::vector(7, unit));
+    }
+}
+
+TEST_F(RawVideo, PacksPaddedRowsAndPassesPackedFramesOn) {
+    format(QvFourcc::I420, 16, 4);
+    out_.setParam(rawWriteThrough, 1);
+    start();
+    const AnyVector strides(48, 24, 24);
+    QvFrame padded;
+    ASSERT_EQ(padded.init(QvFourcc::I420, 16, 4, nullptr, &strides), 0);
+    QvFrame packed = makePicture(QvFourcc::I420, 16, 4);
+    fillPicture(padded, 5);
+    packed = padded;
+    ASSERT_EQ(enc().writeFrame(&padded), 0);
+    EXPECT_TRUE(out_.data == pictureBytes(packed));
+    ASSERT_EQ(enc().writeFrame(&packed), 0);
+    EXPECT_EQ(out_.copies, 2) << "one piece a frame";
+    EXPECT_TRUE(out_.data == pictureBytes(packed) + pictureBytes(packed));
+}
+
+TEST_F(RawVideo, SmallRoomTakesAFrameInPieces) {
+    format(QvFourcc::GRAY, 64, 64);
+    out_.room = 1000;
+    out_.chunk = 700;
+    start();
+    QvFrame frame = makePicture(QvFourcc::GRAY, 64, 64);
+    ASSERT_EQ(enc().writeFrame(&frame), 0);
+    EXPECT_TRUE(out_.data == pictureBytes(frame));
+}
+
+TEST_F(RawVideo, StalledOutputHoldsTheFourthFrame) {
+    format(QvFourcc::GRAY, 32, 32);
+    enc().setParam("accelerationOn", 1);
+    start();
+    out_.shut();
+    QvFrame frame = makePicture(QvFourcc::GRAY, 32, 32);
+    for (int i = 0; i < 3; ++i) ASSERT_EQ(enc().writeFrame(&frame), 0);
+    out_.waitForWriter();
+    auto fourth = std::async(std::launch::async, [&] { return enc().writeFrame(&frame); });
+    EXPECT_EQ(fourth.wait_for(std::chrono::milliseconds(50)), std::future_status::timeout);
+    out_.open();
+    EXPECT_EQ(fourth.get(), 0);
+    EXPECT_EQ(enc().close(), 0);
+    EXPECT_EQ(out_.units.size(), 4u);
+}
+
+TEST_F(RawVideo, AbortDropsWhatIsQueued) {
+    format(QvFourcc::GRAY, 32, 32);
+    enc().setParam("accelerationOn", 1);
+    start();
+    out_.shut();
+    QvFrame frame = makePicture(QvFourcc::GRAY, 32, 32);
+    for (int i = 0; i < 3; ++i) ASSERT_EQ(enc().writeFrame(&frame), 0);
+    out_.waitForWriter();
+    auto aborted = std::async(std::launch::async, [&] { return enc().abort(); });
+    out_.open();
+    EXPECT_EQ(aborted.get(), 0);
+    EXPECT_LT(out_.units.size(), 3u);
+    EXPECT_EQ(out_.data.size(), out_.units.size() * 1024);
+    EXPECT_EQ(enc().getState(), QvCodec::stateInitialised);
+    EXPECT_EQ(enc().open(), 0) << "it can be used again";
+}
+
+TEST_F(RawVideo, RefusedBlockIsABrokenContract) {
+    format(QvFourcc::GRAY, 32, 32);
+    out_.failAfter = 1500;
+    start();
+    QvFrame frame = makePicture(QvFourcc::GRAY, 32, 32);
+    ASSERT_EQ(enc().writeFrame(&frame), 0);
+    LogCapture log;
+    EXPECT_THROW(enc().writeFrame(&frame), QvAssertFailure);
+    EXPECT_TRUE(log.contains("Error in raw encoder, can not allocate buffer, size=1024"));
+    out_.lock();  // not left locked
+    out_.unlock();
+    EXPECT_EQ(enc().close(), 0);
+}
+
+TEST_F(RawVideo, FailureOfTheWorkerReachesTheCaller) {
+    format(QvFourcc::GRAY, 32, 32);
+    enc().setParam("accelerationOn", 1);
+    out_.setParam(rawWriteThrough, 1);
+    out_.failAfter = 1500;
+    start();
+    QvFrame frame = makePicture(QvFourcc::GRAY, 32, 32);
+    int result = 0;
+    for (int i = 0; i < 1000 && result == 0; ++i) result = enc().writeFrame(&frame);
+    EXPECT_EQ(result, -1);
+    EXPECT_STREQ(enc().errorDesc(), "Can not write to the output");
+    EXPECT_EQ(enc().close(), -1);
+    EXPECT_EQ(out_.data.size(), 1024u);
+
+    out_.failAfter = SIZE_MAX;
+    ASSERT_EQ(enc().open(), 0) << "the failure belongs to the run before";
+    EXPECT_EQ(enc().writeFrame(&frame), 0);
+    EXPECT_EQ(enc().close(), 0);
+}
+
+TEST_F(RawVideo, RefusesWhatDoesNotFit) {
+    format(QvFourcc::I420, 64, 48);
+    QvFrame good = makePicture(QvFourcc::I420, 64, 48);
+    EXPECT_EQ(enc().writeFrame(&good), QvStatus::illegalState);
+    EXPECT_EQ(enc().open(), -1);
+    EXPECT_STREQ(enc().errorDesc(), "Output stream not attached");
+    start();
+    EXPECT_EQ(enc().open(), -1);
+    QvFrame none;
+    QvFrame small = makePicture(QvFourcc::I420, 64, 46);
+    QvFrame other = makePicture(QvFourcc::I422, 64, 48);
+    for (QvFrame* frame : {static_cast<QvFrame*>(nullptr), &none, &small, &other})
+        EXPECT_EQ(enc().writeFrame(frame), QvStatus::invalidArgument);
+    EXPECT_TRUE(out_.data.empty());
+    EXPECT_EQ(enc().writeFrame(&good), 0);
+}
+
+TEST_F(RawVideo, BadFormatsLeaveTheGoodOne) {
+    format(QvFourcc::I420, 64, 48);
+    EXPECT_EQ(enc().setParam("type", 1234), QvStatus::invalidParam);
+    EXPECT_EQ(enc().setParam("type", "I420"), QvStatus::invalidParam);
+    for (const int size : {0, -4, 1 << 30}) EXPECT_EQ(enc().setParam("width", size), QvStatus::invalidParam);
+    EXPECT_EQ(enc().setParam("framerate", 0), QvStatus::invalidParam);
+    EXPECT_EQ(number("width"), 64);
+    EXPECT_EQ(number("_outFrameSize"), 64 * 48 * 3 / 2);
+    EXPECT_THROW(enc().setParam("nonsense", 1), QvParamException);
+}
+
+TEST_F(RawVideo, V210NeedsItsConverter) {
+    format(QvFourcc::v210, 1280, 720);
+    EXPECT_EQ(number("selectedFOURCC"), static_cast<int>(QvFourcc::Y216));
+    EXPECT_EQ(number("_outFrameSize"), 128 * ((1280 + 47) / 48) * 720);
+}
+
+TEST_F(RawVideo, KeepsTheLatestFrameWhenAsked) {
+    format(QvFourcc::GRAY, 32, 32);
+    start();
+    QvFrame frame = makePicture(QvFourcc::GRAY, 32, 32, 3);
+    enc().writeFrame(&frame);
+    EXPECT_EQ(enc().lastFrame(), nullptr);
+    enc().setParam("getOut", 1);
+    enc().writeFrame(&frame);
+    ASSERT_NE(enc().lastFrame(), nullptr);
+    EXPECT_TRUE(pictureBytes(*enc().lastFrame()) == pictureBytes(frame));
+    enc().close();
+    EXPECT_EQ(enc().lastFrame(), nullptr);
+    EXPECT_EQ(number("_outFrameSize"), 1024) << "known while closed";
+}
+
+TEST_F(RawVideo, Answers) {
+    format(QvFourcc::BGR3, 720, 576);
+    enc().setParam("framerate", QvFramerate(25.0));
+    const auto get = [&](const char* name) { return static_cast<QvCodec&>(enc()).getParam(name); };
+    const double bits = 25.0 * 2160 * 576 * 8;
+    EXPECT_EQ(get("vBitrate"), Any(bits));
+    EXPECT_EQ(get("bitrate").asBitrate().target, static_cast<int>(bits));
+    EXPECT_EQ(get("estimateSecKb"), Any(static_cast<float>(bits / 8000)));
+    EXPECT_EQ(get("frameAspect"), Any(1.25f));
+    EXPECT_EQ(get("allowedTypes").size(), 10);
+    enc().setParam("profile", 0x2160010);
+    const auto allowed = get("allowedTypes");
+    EXPECT_EQ(allowed.size(), 7);
+    EXPECT_EQ(allowed.asVector().back(),
+              Any(AnyDict("type", static_cast<int>(QvFourcc::Y216), "name", "Y216")));
+    EXPECT_EQ(get("accelerationOn"), Any(0));
+    enc().setParam("interlaced", 2);
+    EXPECT_EQ(get("framerate").asFramerate().interlaced(), 2);
+    enc().setParam("framerate", 50);
+    EXPECT_EQ(get("framerate").asFramerate().interlaced(), 2) << "a bare number changes the rate only";
+    // What no integer holds is the largest one.
+    format(QvFourcc::b64a, 4096, 4096);
+    EXPECT_EQ(get("bitrate").asBitrate().target, INT_MAX);
+}
+
+TEST_F(RawVideo, StoredStateComesBack) {
+    format(QvFourcc::UYVY, 320, 200);
+    enc().setParam("framerate", QvFramerate(30.0, 1));
+    AnyDict state;
+    enc().store(state);
+    for (const char* form : {"settingsDict", "settings", "flat"}) {
+        SCOPED_TRACE(form);
+        AnyDict stored("name", "rawvenc");
+        if (std::string(form) == "flat")
+            stored.update(state.get("settingsDict").asDict());
+        else
+            stored.set(form, state.get("settingsDict"));
+        std::unique_ptr<RawVideoEnc> other(static_cast<RawVideoEnc*>(module_.create()));
+        other->init();
+        ASSERT_EQ(other->restore(stored), 0);
+        AnyDict again;
+        other->store(again);
+        EXPECT_EQ(again, state);
+    }
+    EXPECT_EQ(enc().restore(AnyDict("name", "rawaenc")), -1);
+    EXPECT_STREQ(enc().errorDesc(), "restore - invalid name");
+}
+
+}  // namespace
