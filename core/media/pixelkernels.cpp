@@ -214,6 +214,8 @@ void spreadMask(Byte* dst, const Byte* mask, int step, int copies, size_t pixels
     }
 }
 
+const char* vectorUnit() { return hwy::TargetName(HWY_TARGET); }
+
 }  // namespace HWY_NAMESPACE
 }  // namespace qvpixels
 HWY_AFTER_NAMESPACE();
@@ -228,6 +230,7 @@ HWY_EXPORT(maskWords);
 HWY_EXPORT(mixBytes);
 HWY_EXPORT(mixWords);
 HWY_EXPORT(spreadMask);
+HWY_EXPORT(vectorUnit);
 
 void averageBytes(Byte* dst, const Byte* a, const Byte* b, std::size_t bytes) {
     HWY_DYNAMIC_DISPATCH(averageBytes)(dst, a, b, bytes);
@@ -256,6 +259,8 @@ void mixWords(Byte* dst, const Byte* src, int alpha, std::size_t words) {
 void spreadMask(Byte* dst, const Byte* mask, int step, int copies, std::size_t pixels) {
     HWY_DYNAMIC_DISPATCH(spreadMask)(dst, mask, step, copies, pixels);
 }
+
+const char* vectorUnit() { return HWY_DYNAMIC_DISPATCH(vectorUnit)(); }
 
 }  // namespace qvpixels
 #endif

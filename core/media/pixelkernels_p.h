@@ -27,4 +27,7 @@ void mixWords(Byte* dst, const Byte* src, int alpha, std::size_t words);
 // times (1 to 4).
 void spreadMask(Byte* dst, const Byte* mask, int step, int copies, std::size_t pixels);
 
+// Which unit the others run on, as in "AVX2".
+const char* vectorUnit();
+
 }  // namespace qvpixels

@@ -1,0 +1,102 @@
+#include "core/media/mediatime.h"
+
+#include <gtest/gtest.h>
+
+#include <climits>
+#include <string>
+
+#include "core/engine/qvexception.h"
+#include "core/media/qvgeometry.h"
+
+namespace {
+
+constexpr long long scale = MediaTime::defaultTimescale;
+
+TEST(MediaTime, EveryNamedRateIsExactAtTheDefaultTimescale) {
+    const QvFramerate rates[] = {QvFramerate::f23p(), QvFramerate::f24p(), QvFramerate::f25p(),
+                                 QvFramerate::f29p(), QvFramerate::f30p(), QvFramerate::f50p(),
+                                 QvFramerate::f59p(), QvFramerate::f60p()};
+    for (const auto& rate : rates)
+        for (long long position : {0LL, 1LL, 2LL, 1001LL, 10000000LL, -5LL}) {
+            const MediaTime time(position, rate, scale);
+            EXPECT_EQ(time.value() * rate.rate().num, position * scale * rate.rate().den);
+            EXPECT_EQ(time.position(rate), position);
+        }
+    for (int samplerate : {44100, 48000})
+        EXPECT_EQ(MediaTime(12345, samplerate, scale).position(samplerate), 12345);
+    EXPECT_EQ(MediaTime(1, QvRatio(30000, 1001), scale).value(), 1177176);
+}
+
+TEST(MediaTime, TruncatesAtOtherTimescales) {
+    EXPECT_EQ(MediaTime(1, QvRatio(30000, 1001), 1000).value(), 33);
+    EXPECT_EQ(MediaTime(-1, QvRatio(30000, 1001), 1000).value(), -33);
+    EXPECT_EQ(MediaTime(33, 1000).position(QvRatio(30000, 1001)), 0);
+    EXPECT_EQ(MediaTime(34, 1000).position(QvRatio(30000, 1001)), 1);
+    // The display rate of a pulldown does not matter.
+    EXPECT_EQ(MediaTime(scale, scale).position(QvFramerate(24.0, 0, false, 1)), 24);
+}
+
+TEST(MediaTime, SecondsAndClockTime) {
+    EXPECT_EQ(MediaTime(1.5, 1000).value(), 1500);
+    EXPECT_EQ(MediaTime(0.0006, 1000).value(), 1);
+    EXPECT_EQ(MediaTime(-0.0009, 1000).value(), 0);  // truncation of -0.4
+    EXPECT_EQ(MediaTime(1500, 1000).ms(), 1500);
+    EXPECT_DOUBLE_EQ(MediaTime(1500, 1000).toDouble(), 1.5);
+    EXPECT_EQ(MediaTime(QvTime(1, 2, 3, 4, 999), 1000).value(), 3723004);
+    EXPECT_EQ(MediaTime(3723004 * 35280LL, scale).time(), QvTime(1, 2, 3, 4, 0));
+    EXPECT_EQ(MediaTime(scale + scale / 3000, scale).time(), QvTime(0, 0, 1, 0, 333));
+    char text[QvTimecode::textSize];
+    MediaTime(1800, QvRatio(30000, 1001), scale).timecode(QvFramerate(29.97, 0, true)).pprint(text, true);
+    EXPECT_STREQ(text, "00;01;00;02");
+}
+
+TEST(MediaTime, ComparesWithinOneTimescaleOnly) {
+    const MediaTime one(1, 10), two(2, 10), same(2, 20);
+    EXPECT_TRUE(one < two && one <= two && two > one && two >= one && one != two);
+    EXPECT_TRUE(one + one == two && two - one == one);
+    EXPECT_FALSE(one == same);
+    EXPECT_TRUE(one != same);
+    EXPECT_THROW((void)(one < same), QvAssertFailure);
+    EXPECT_THROW((void)(one <= same), QvAssertFailure);
+    EXPECT_THROW((void)(one > same), QvAssertFailure);
+    EXPECT_THROW((void)(one >= same), QvAssertFailure);
+    EXPECT_THROW((void)(one + same), QvAssertFailure);
+    EXPECT_THROW((void)(one - same), QvAssertFailure);
+    EXPECT_EQ(MediaTime().timescale(), scale);
+}
+
+TEST(MediaTime, RefusesTimescalesBelowOne) {
+    const auto message = [](auto make) -> std::string {
+        try {
+            make();
+        } catch (const QvAssertFailure& failure) {
+            return failure.what();
+        }
+        return "none";
+    };
+    constexpr char text[] = "MediaTime: invalid timescale";
+    EXPECT_NE(message([] { MediaTime(1, 0LL); }).find(text), std::string::npos);
+    EXPECT_NE(message([] { MediaTime(1.0, -5LL); }).find(text), std::string::npos);
+    EXPECT_NE(message([] { MediaTime(1, QvFramerate(), 0); }).find(text), std::string::npos);
+    EXPECT_NE(message([] { MediaTime(1, 25, 0); }).find(text), std::string::npos);
+    EXPECT_NE(message([] { MediaTime(QvTime(), 0); }).find(text), std::string::npos);
+    EXPECT_EQ(message([] { MediaTime(1, QvRatio(25, 1), 0); }).find(text), std::string::npos);
+    EXPECT_THROW(MediaTime(1, QvRatio(25, 1), 0), QvAssertFailure);
+    EXPECT_THROW(MediaTime(1, QvRatio(0, 1), scale), QvAssertFailure);
+    EXPECT_THROW((void)MediaTime().position(QvRatio(25, 0)), QvAssertFailure);
+}
+
+TEST(MediaTime, LargeProductsAreExactAndSaturate) {
+    const MediaTime late(LLONG_MAX, scale);
+    EXPECT_EQ(late.position(48000), LLONG_MAX / 735);
+    EXPECT_EQ(late.position(QvRatio(60000, 1001)),
+              static_cast<long long>(static_cast<unsigned __int128>(LLONG_MAX) / 588588));
+    EXPECT_EQ(MediaTime(LLONG_MAX, QvRatio(1, INT_MAX), scale).value(), LLONG_MAX);
+    EXPECT_EQ(MediaTime(LLONG_MIN, QvRatio(1, INT_MAX), LLONG_MAX).value(), LLONG_MIN);
+    EXPECT_EQ((late + late).value(), LLONG_MAX);
+    (void)MediaTime(LLONG_MIN, 1).time();
+    (void)MediaTime(LLONG_MAX, LLONG_MAX).time();
+    (void)MediaTime(1e300, scale);
+}
+
+}  // namespace

@@ -1,0 +1,126 @@
+#include "core/media/timecode.h"
+
+#include <gtest/gtest.h>
+
+#include <climits>
+#include <string>
+
+#include "core/media/qvframerate.h"
+
+namespace {
+
+std::string text(const QvTimecode& timecode, bool semicolons = true) {
+    char buffer[QvTimecode::textSize];
+    timecode.pprint(buffer, semicolons);
+    return buffer;
+}
+
+const QvFramerate ntscDf(29.97, 1, true);
+
+TEST(QvTimecode, KnownFrames) {
+    struct Case {
+        int frame;
+        QvFramerate rate;
+        const char* text;
+    };
+    const QvFramerate df60(59.94, 0, true), df25(25.0, 0, true), pal(25.0);
+    const Case cases[] = {
+        {1799, ntscDf, "00;00;59;29"},
+        {1800, ntscDf, "00;01;00;02"},
+        {17981, ntscDf, "00;09;59;29"},
+        {17982, ntscDf, "00;10;00;00"},
+        {107892, ntscDf, "01;00;00;00"},
+        {107892 * 24, ntscDf, "00;00;00;00"},
+        {3599, df60, "00;00;59;59"},
+        {3600, df60, "00;01;00;04"},
+        {35964, df60, "00;10;00;00"},
+        {1800, df25, "00;01;00;02"},
+        {25, pal, "00;00;01;00"},
+        {25 * 3600 * 24 + 1, pal, "00;00;00;01"},
+        {5, QvFramerate(QvRatio(0, 1)), "00;00;00;00"},
+    };
+    for (const auto& c : cases) {
+        const QvTimecode timecode(c.frame, c.rate, false);
+        EXPECT_EQ(text(timecode), c.text) << c.frame;
+        EXPECT_EQ(timecode.df(), c.rate.df());
+    }
+    EXPECT_EQ(text(QvTimecode(1, 2, 3, 4), false), "01:02:03:04");
+}
+
+// Counted up from the rule itself: in every minute but each tenth the first numbers do not exist.
+TEST(QvTimecode, DropFrameCountsAsTheRuleSays) {
+    for (const auto& [rate, fps, drop] :
+         {std::tuple(ntscDf, 30, 2), std::tuple(QvFramerate(59.94, 0, true), 60, 4)}) {
+        int minute = 0, second = 0, frame = 0;
+        for (int number = 0; number < 25 * 60 * fps; ++number) {
+            const QvTimecode timecode(number, rate, false);
+            ASSERT_EQ(timecode.minutes(), minute) << number;
+            ASSERT_EQ(timecode.seconds(), second) << number;
+            ASSERT_EQ(timecode.frames(), frame) << number;
+            ASSERT_EQ(timecode.frameNr(rate, false), number);
+            if (++frame < fps) continue;
+            frame = 0;
+            if (++second < 60) continue;
+            second = 0;
+            if (++minute % 10 != 0) frame = drop;
+        }
+    }
+}
+
+TEST(QvTimecode, FieldsCountTwice) {
+    const QvFramerate fields(50.0);
+    for (int number : {0, 1, 49, 50, 51, 123457}) {
+        const QvTimecode timecode(number, fields, true);
+        EXPECT_EQ(timecode.field(), number % 2 != 0);
+        EXPECT_EQ(text(timecode), text(QvTimecode(number / 2, QvFramerate(25.0), false)));
+        EXPECT_EQ(timecode.frameNr(fields, true), number);
+    }
+}
+
+TEST(QvTimecode, SecondsUseTheDisplayRate) {
+    const QvTimecode timecode(0, 1, 0, 0);
+    EXPECT_DOUBLE_EQ(timecode.seconds(QvFramerate(25.0), true), 60.0);
+    EXPECT_DOUBLE_EQ(timecode.seconds(QvFramerate(24.0, 0, false, 1), false), 1440 / 30.0);
+    EXPECT_EQ(timecode.seconds(QvFramerate(QvRatio(5, 0)), false), 0.0);
+}
+
+TEST(QvTimecode, ReadsFourPartsOrNone) {
+    struct Case {
+        const char* in;
+        const char* out;
+        bool df;
+    };
+    const Case cases[] = {
+        {"01;02:03:04", "01:02:03:04", true},
+        {"01:02:03:04", "01:02:03:04", false},
+        {"01:02:03", "00:00:00:00", false},
+        {"01;02:03", "00:00:00:00", true},
+        {"1:2:3:4:5", "00:00:00:00", false},
+        {"", "00:00:00:00", false},
+        {":::", "00:00:00:00", false},
+        {" 7x:y8:-3:4z", "07:00:-03:04", false},
+        {"99999999999:0:0:0", "2147483647:00:00:00", false},
+        {nullptr, "00:00:00:00", false},
+    };
+    for (const auto& c : cases) {
+        const QvTimecode timecode(c.in);
+        EXPECT_EQ(text(timecode, false), c.out);
+        EXPECT_EQ(timecode.df(), c.df);
+    }
+}
+
+TEST(QvTimecode, ExtremesStayDefined) {
+    for (int number : {INT_MIN, -1, INT_MAX})
+        for (const auto& rate :
+             {ntscDf, QvFramerate(QvRatio(INT_MIN, 1)), QvFramerate(QvRatio(INT_MAX, 1), 0, true)})
+            for (bool fields : {false, true}) {
+                const QvTimecode timecode(number, rate, fields);
+                (void)timecode.seconds(rate, fields);
+                EXPECT_LT(text(timecode).size(), static_cast<std::size_t>(QvTimecode::textSize));
+            }
+    EXPECT_EQ(text(QvTimecode(INT_MIN, INT_MIN, INT_MIN, INT_MIN)).size(), QvTimecode::textSize - 1u);
+    (void)QvTimecode(INT_MAX, INT_MAX, INT_MAX, INT_MAX)
+        .frameNr(QvFramerate(QvRatio(INT_MAX, 1), 0, true), true);
+}
+
+}  // namespace
