@@ -14,7 +14,7 @@ constexpr unsigned ringChunk = 0x40001;
 }  // namespace
 
 int BufMemOut::init() {
-    ring_ = bytefifo::make(ringSize, ringChunk);
+    ring_ = bytefifo::make(std::max(ringSize, size_), ringChunk);
     return ring_ ? Bufstream::init() : QvStatus::outOfMemory;
 }
 

@@ -9,7 +9,8 @@
 
 class BufMemOut : public Bufstream {
   public:
-    explicit BufMemOut(QvAuxinfoQueue* queue) : queue_(queue) {}
+    // The ring has at least `size` bytes, so that an access unit of as many fits.
+    explicit BufMemOut(QvAuxinfoQueue* queue, unsigned size = 0) : size_(size), queue_(queue) {}
 
     int init() override;  // QvStatus::outOfMemory without memory for the ring
     unsigned usable() override { return ring_->room(); }
@@ -27,6 +28,7 @@ class BufMemOut : public Bufstream {
     void queueInfo(unsigned id, void* info, unsigned size);
     void takePayload(unsigned char* target, unsigned bytes);
 
+    unsigned size_;
     std::unique_ptr<bytefifo> ring_;
     QvAuxinfoQueue* queue_;
 };

@@ -1,5 +1,6 @@
 #include "core/stream/qvbufmem.h"
 
+#include <algorithm>
 #include <deque>
 
 #include "core/engine/qvthreads.h"
@@ -51,7 +52,9 @@ int QvMemOutStream::init(const AnyDict& newParams) {
     out_.reset();
     const Any& queue = params().get("outputQueue");
     if (!queue.isGeneric() || queue.size() != 0 || !queue.asGeneric()) return QvStatus::illegalState;
-    out_ = std::make_unique<BufMemOut>(static_cast<QvAuxinfoQueue*>(queue.asGeneric()));
+    const int size = std::max(params().getInt32("size"), 0);
+    out_ = std::make_unique<BufMemOut>(static_cast<QvAuxinfoQueue*>(queue.asGeneric()),
+                                       static_cast<unsigned>(size));
     if (const int status = out_->init()) {
         out_.reset();
         return status;

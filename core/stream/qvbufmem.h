@@ -70,6 +70,8 @@ class QV_API QvMemOutStream : public QvBufStream {
     explicit QvMemOutStream(QvCodec* owner = nullptr);
     ~QvMemOutStream() override;
 
+    // Parameter "size" (Int32, bytes): an access unit may be that large; never below 2,097,152.
+
     // Sets the parameter "outputQueue". The queue is borrowed and must outlive the stream.
     void setOutputQueue(QvAuxinfoQueue* queue);
 
