@@ -1,10 +1,11 @@
-// The makers of the built-in codecs, one line for each module that exists, in the order of builtin.cpp.
+// The makers of the built-in codecs, one line for each module that exists.
 //
 // A module lives in builtin/KIND/NAME.{h,cpp}, which defines its maker: it returns a new codec without a
 // module, which the caller owns. A new module is that unit, a line here, and the maker in its row.
 #pragma once
 
 class QvCodec;
+
 QvCodec* newRawdec();
 QvCodec* newTestgen();
 QvCodec* newWavdec();

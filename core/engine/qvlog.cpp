@@ -124,7 +124,7 @@ int QvDbgLog::openTarget(Any& target) {
         stream_ = std::fopen(target.asString(), "w");
     if (stream_ || debugger_) return QvStatus::ok;
     debug_trace(Any::sprintf("[DbgLog] *** Failed to open logfile %s for writing -> redirecting output to "
-                             "stderr",
+                             "stderr\n",
                              target.asString())
                     .asString());
     stream_ = stderr;

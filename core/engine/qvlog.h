@@ -43,7 +43,8 @@ class QV_API QvDbgLog {
     // target, given again, is left alone. 0, or -8 if the file can't be opened: the standard error serves.
     int init(const Any* logfile, QvLogBase* logger);
     int setLogfile(Any* logfile) { return init(logfile, logger()); }
-    void setLogger(QvLogBase* logger);  // null only stops the calls
+    // Null only stops the calls: when it returns, none is running on another thread.
+    void setLogger(QvLogBase* logger);
     QvLogBase* logger() const;
     // False: whatever is logged vanishes, so a caller can spare itself the text.
     bool hasTarget() const;

@@ -133,6 +133,7 @@ void QvLogBuffer::fappend(const char* format, ...) {
 int QvLogBuffer::setLogFile(const Any& name) {
     Lock lock(section());
     if (copy_) std::fclose(copy_);
+    copy_ = nullptr;
     copy_ = name.isTrue() ? static_cast<std::FILE*>(qvfopen(name, "w")) : nullptr;
     return copy_ ? QvStatus::ok : QvStatus::failed;
 }

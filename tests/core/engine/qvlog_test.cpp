@@ -10,6 +10,7 @@
 #include <thread>
 #include <vector>
 
+#include "core/engine/qvexception.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/temp_folder.h"
 
@@ -264,6 +265,8 @@ TEST(LogBuffer, CopyFileTakesMessagesUntilItIsClosed) {
     buffer.append("50% of %s", 8);
     EXPECT_EQ(buffer.setLogFile(Any()), -1);
     buffer.info("later");
+    EXPECT_THROW(buffer.setLogFile(Any(1)), QvAssertFailure);
+    EXPECT_NO_THROW(buffer.info("latest"));
     EXPECT_EQ(TempFolder::read(folder.file("copy")), "100%\n50% of %s\n");
 }
 
