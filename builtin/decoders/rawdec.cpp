@@ -27,7 +27,10 @@ int setFramerate(Settings& settings, const Any& value) {
         settings.framerate.setAll(rate.rate(), rate.interlaced(), false, 0);
         return QvStatus::ok;
     }
-    if (!(value.isInt() || value.isFloat()) || !(value.toDouble() > 0)) return QvStatus::invalidParam;
+    // What no fraction of 32-bit numbers comes near to is no rate either.
+    constexpr double most = 1e6;
+    if (!(value.isInt() || value.isFloat())) return QvStatus::invalidParam;
+    if (!(value.toDouble() >= 1 / most && value.toDouble() <= most)) return QvStatus::invalidParam;
     settings.framerate.setRate(value.toDouble());
     return QvStatus::ok;
 }
@@ -146,6 +149,12 @@ void RawDecoder::makeFields() {
     for (QvFrame& field : fields_) field.init(fourcc_, settings_.width, settings_.height / 2);
 }
 
+int RawDecoder::checkFields() {
+    if (!isFieldFile() || 2LL * fields_[0].total_bytes() == frame_.total_bytes()) return QvStatus::ok;
+    return setError(QvStatus::failed, "Frames of %dx%d can not be read by fields", settings_.width,
+                    settings_.height);
+}
+
 int RawDecoder::makeConverter() {
     converter_.reset();
     if (fileFormat_ != FileFormat::v210) return QvStatus::ok;
@@ -159,6 +168,10 @@ int RawDecoder::makeConverter() {
         return setError(QvStatus::failed, "media dec: no converter for v210");
     converter_ = std::move(converter);
     return QvStatus::ok;
+}
+
+QvVideoFilter* RawDecoder::converterFilter() const {
+    return static_cast<QvVideoFilter*>(converter_->getInterface(QvModuleType::videoFilter));
 }
 
 int RawDecoder::rewind() {
@@ -228,9 +241,7 @@ int RawDecoder::open() {
         return setError(QvStatus::failed, "media dec: filename not set");
     if (!frame_.inited())
         return setError(QvStatus::failed, "Invalid frame size %dx%d", settings_.width, settings_.height);
-    if (isFieldFile() && 2LL * fields_[0].total_bytes() != frame_.total_bytes())
-        return setError(QvStatus::failed, "Frames of %dx%d can not be read by fields", settings_.width,
-                        settings_.height);
+    if (const int result = checkFields(); result != QvStatus::ok) return result;
     if (const int result = makeConverter(); result != QvStatus::ok) return result;
     if (file_.open(filename_, readAhead) != QvStatus::ok)
         return setError(QvStatus::failed, "Can not open file");
@@ -335,7 +346,7 @@ bool RawDecoder::isSelected(int type, int stream) const {
 
 QvFrame* RawDecoder::getFramePtr(int stream) {
     if (stream != 0) return nullptr;
-    return fileFormat_ == FileFormat::v210 ? &converted_ : &frame_;
+    return converter_ ? converterFilter()->frame() : &frame_;
 }
 
 // --- No sound.
@@ -375,6 +386,7 @@ int RawDecoder::seekToFrame(long long frame, int stream) {
 }
 
 int RawDecoder::readNext() {
+    if (const int result = checkFields(); result != QvStatus::ok) return result;
     if (isFieldFile()) {
         for (QvFrame& field : fields_)
             if (const int result = readImage(field); result != QvStatus::ok) return result;
@@ -436,13 +448,13 @@ int RawDecoder::readPacked(QvFrame& to) {
     return QvStatus::ok;
 }
 
+// The converted frame stays in the converter, where getFramePtr finds it, until the next one.
 int RawDecoder::convert() {
-    auto* filter = static_cast<QvVideoFilter*>(converter_->getInterface(QvModuleType::videoFilter));
-    const int result = filter->write(frame_);
-    if (result != QvStatus::ok) return setError(result, "%s", filter->errorDesc());
-    if (!filter->ready()) return setError(QvStatus::failed, "media dec: no converter for v210");
-    converted_ = *filter->frame();
-    return filter->next();
+    QvVideoFilter& filter = *converterFilter();
+    if (filter.ready()) filter.next();
+    if (const int result = filter.write(frame_); result != QvStatus::ok)
+        return setError(result, "%s", filter.errorDesc());
+    return filter.ready() ? QvStatus::ok : setError(QvStatus::failed, "media dec: no converter for v210");
 }
 
 QvCodec* newRawdec() { return new RawDecoder; }

@@ -21,6 +21,8 @@
 #include "core/decode/qvdecoder.h"
 #include "core/media/qvbuffer.h"
 
+class QvVideoFilter;
+
 class RawDecoder : public QvDecodePipe {
   public:
     explicit RawDecoder(const QvModule* module = nullptr);
@@ -78,14 +80,15 @@ class RawDecoder : public QvDecodePipe {
     QvFrame fields_[2];  // in the file's order
     std::vector<unsigned char> readBuffer_;
     std::unique_ptr<QvCodec> converter_;  // of v210 only
-    QvFrame converted_;
 
     int setFOURCC(const Any& value);
     int changeFormat(unsigned code);
     int changeSettings(const Settings& changed);
     int makeFrame();
     void makeFields();
+    int checkFields();
     int makeConverter();
+    QvVideoFilter* converterFilter() const;
     int rewind();
 
     bool isFieldFile() const { return settings_.fieldOrderFile && settings_.framerate.interlaced() != 0; }

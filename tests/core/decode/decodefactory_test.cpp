@@ -72,8 +72,8 @@ class Factory : public testing::Test {
         return std::unique_ptr<QvDecodePipe>(QvDecFactory::decodePipe(name, fourcc, &events, params));
     }
 
+    QvPlugin plugin{"fakes", "Fakes"};  // outlives its stay in the registry
     Engine engine;
-    QvPlugin plugin{"fakes", "Fakes"};
     FakeModule* first;
     FakeModule* second;
     Events events;
