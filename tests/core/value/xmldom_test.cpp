@@ -1,0 +1,257 @@
+#include "core/value/xmldom.h"
+
+#include <gtest/gtest.h>
+
+#include <cstdio>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "core/engine/qvexception.h"
+#include "tests/core/value/value_support.h"
+#include "tests/support/temp_folder.h"
+
+namespace {
+
+std::string repeated(std::string_view text, std::size_t count) {
+    std::string result;
+    while (count-- > 0) result += text;
+    return result;
+}
+
+// What parsing fails with, without the file's name; empty if it does not fail.
+std::string parseFailure(const std::string& document, XmlParser* parser = nullptr) {
+    const TempFolder folder;
+    XmlParser own;
+    const std::string file = folder.write("a.xml", document);
+    try {
+        EXPECT_EQ((parser ? parser : &own)->parseFile(file.c_str()), 0);
+        return "";
+    } catch (const QvFileException& failure) {
+        std::string text = failure.what();
+        const std::string start = "Error in xml file " + file + " ";
+        EXPECT_TRUE(text.starts_with(start)) << text;
+        return text.substr(std::min(text.size(), start.size()));
+    }
+}
+
+std::string written(const XmlNode& node, int indent = 0) {
+    const std::unique_ptr<std::FILE, int (*)(std::FILE*)> file(std::tmpfile(), std::fclose);
+    EXPECT_EQ(node.write(file.get(), indent), 0);
+    std::string text(static_cast<std::size_t>(std::ftell(file.get())), 0);
+    std::rewind(file.get());
+    EXPECT_EQ(std::fread(text.data(), 1, text.size(), file.get()), text.size());
+    return text;
+}
+
+TEST(XmlNode, dataGrowsAndFormats) {
+    const char* attrs[] = {"b", "2", "a", "\xC3\xA9", nullptr};
+    XmlNode node("n", attrs, nullptr, "abc");
+    EXPECT_EQ(node.getAttr("b"), "2");
+    EXPECT_EQ(node.getAttr("a"), Any(u"\u00e9"));
+    EXPECT_TRUE(node.getAttr("c").isNull());
+    node.addRawData("defgh", 2);
+    EXPECT_EQ(node.rawData(), "abcde");
+    EXPECT_EQ(node.dataSize(), 5);
+
+    const std::string longText(2000, 'x');
+    node.sprintf("%s", longText.c_str());
+    EXPECT_EQ(node.dataSize(), 511);
+    node.addRawData(longText.c_str());
+    EXPECT_EQ(node.dataSize(), 2511);
+    node.sprintf("%s%d", longText.c_str(), 12);
+    EXPECT_EQ(node.dataSize(), 2002);  // more room since the data has grown
+    node.sprintf("%s", "");
+    EXPECT_EQ(node.rawData(), "");
+    EXPECT_STREQ(node.data(), "");
+    node.addRawData("\xC3\xA4");
+    EXPECT_EQ(node.rawData(), Any(u"\u00e4"));
+}
+
+TEST(XmlNode, childrenAndNames) {
+    XmlNode root("ns:root");
+    auto* first = new XmlNode("x:a", nullptr, &root);
+    new XmlNode(nullptr, nullptr, &root);
+    auto* third = new XmlNode("a:b:c", nullptr, first);
+    EXPECT_EQ(root.nrChildren(), 2);
+    EXPECT_EQ(root.child("x:a"), first);
+    EXPECT_EQ(root.child("none"), nullptr);
+    EXPECT_EQ(failureOf([&] { root.child(2); }), "");
+    EXPECT_EQ(root.child(1)->name(), nullptr);
+
+    root.stripXMLNamespace(false);
+    EXPECT_STREQ(root.name(), "root");
+    EXPECT_STREQ(first->name(), "x:a");
+    root.stripXMLNamespace(true);
+    EXPECT_STREQ(first->name(), "a");
+    EXPECT_STREQ(third->name(), "a:b:c");
+    root.deleteChildren();
+    EXPECT_EQ(root.nrChildren(), 0);
+}
+
+TEST(XmlNode, writtenForm) {
+    XmlNode root("r");
+    EXPECT_EQ(written(root), "<r/>\n");
+    root.setAttr("b", "<&>\"'");
+    root.setAttr("a", Any(u"\u00e9\U0001F3AC"));
+    XmlNode* const leaf = new XmlNode("leaf", nullptr, &root, "a<b");
+    new XmlNode(nullptr, nullptr, &root, "lost");
+    new XmlNode("empty", nullptr, new XmlNode("inner", nullptr, &root));
+    root.addRawData("own");
+    EXPECT_EQ(written(root, 1),
+              "  <r a=\"\xC3\xA9\xF0\x9F\x8E\xAC\" b=\"&lt;&amp;&gt;&quot;&apos;\">\n"
+              "    <leaf>a&lt;b</leaf>\n"
+              "    <inner>\n"
+              "      <empty/>\n"
+              "    </inner>\n"
+              "own  </r>\n");
+    leaf->sprintf("%s", "a\x01\xFF\tz");
+    EXPECT_EQ(written(*leaf), "<leaf>a\xEF\xBF\xBD\xEF\xBF\xBD\tz</leaf>\n");
+    root.setName(nullptr);
+    EXPECT_EQ(root.write(stdout, 0), -1);
+}
+
+TEST(XmlParser, buildsTheTree) {
+    XmlParser parser;
+    EXPECT_EQ(parser.topLevel(), nullptr);
+    const std::string document =
+        "<?xml version=\"1.0\"?>\n<!DOCTYPE r SYSTEM \"nowhere.dtd\">\n<!-- c --><r k='&lt;&#233;'>x<a></a>\n"
+        "y<![CDATA[<&>]]><b><c/></b></r>";
+    EXPECT_EQ(parseFailure(document, &parser), "");
+    const XmlNode& root = *parser.topLevel();
+    EXPECT_STREQ(root.name(), "r");
+    EXPECT_EQ(root.getAttr("k"), Any(u"<\u00e9"));
+    EXPECT_EQ(root.rawData(), "x\ny<&>");
+    EXPECT_STREQ(root.child("b")->child(0)->name(), "c");
+    EXPECT_EQ(root.child("a")->rawData(), "");
+
+    EXPECT_EQ(parseFailure("<other \xC3\xA4='1'><\xC3\xA4/></other>", &parser), "");
+    EXPECT_STREQ(parser.topLevel()->name(), "other");
+    EXPECT_EQ(parser.topLevel()->getAttr("\xC3\xA4"), "1");
+    EXPECT_STREQ(parser.topLevel()->child(0)->name(), "\xC3\xA4");
+
+    EXPECT_NE(parseFailure("<a><b></a>", &parser), "");
+    EXPECT_EQ(parser.topLevel(), nullptr);
+}
+
+TEST(XmlParser, blocksOfTheReader) {
+    for (std::size_t size : {63999u, 64000u, 64001u, 128000u}) {
+        const std::string frame = "<a></a>";
+        XmlParser parser;
+        EXPECT_EQ(parseFailure("<a>" + std::string(size - frame.size(), 'x') + "</a>", &parser), "") << size;
+        EXPECT_EQ(parser.topLevel()->dataSize(), static_cast<int>(size - frame.size()));
+    }
+}
+
+TEST(XmlParser, damagedDocumentsTellReasonAndLine) {
+    struct Case {
+        std::string document, failure;
+    };
+    const std::string billion = "<!DOCTYPE a [\n<!ENTITY x \"ha\">\n<!ENTITY y \"&x;&x;\">]>\n<a>&y;</a>";
+    const Case cases[] = {
+        {"", "no element found at line 1"},
+        {"\n\n<a>\n<b>", "no element found at line 4"},
+        {"<a>\n<b>\n</a>", "mismatched tag at line 3"},
+        {"<a/>\n<b/>", "junk after document element at line 2"},
+        {std::string("<a>x\0y</a>", 10), "not well-formed (invalid token) at line 1"},
+        {"<a>\xFF</a>", "not well-formed (invalid token) at line 1"},
+        {"<a b='1' b='2'/>", "duplicate attribute at line 1"},
+        {"<?xml version='1.0' encoding='x-none'?><a/>", "unknown encoding at line 1"},
+        {"<a>\n&nothing;</a>", "undefined entity at line 2"},
+        {"<!DOCTYPE a SYSTEM 'x.dtd'>\n<a>&nothing;</a>", "undefined entity at line 2"},
+        {billion, "entity declarations are not allowed at line 2"},
+        {"<!DOCTYPE a [<!ENTITY x SYSTEM 'file:///etc/passwd'>]><a>&x;</a>",
+         "entity declarations are not allowed at line 1"},
+        {"<!DOCTYPE a [<!ENTITY % p SYSTEM 'file:///etc/passwd'> %p;]><a/>",
+         "entity declarations are not allowed at line 1"},
+        {"<!DOCTYPE a [<!NOTATION n SYSTEM 'n'><!ENTITY x SYSTEM 'y' NDATA n>]><a/>",
+         "entity declarations are not allowed at line 1"},
+        {repeated("<a>", 1000000), "elements nested too deep at line 1"},
+        {repeated("<a>", 1001) + repeated("</a>", 1001), "elements nested too deep at line 1"},
+        {"<a b='" + std::string(20 << 20, 'x') + "'/>", "element or declaration too long at line 1"},
+        {"<!DOCTYPE a [<!ATTLIST a b CDATA '" + std::string(1 << 20, 'x') + "'>]><r>" +
+             repeated("<a/>", 100) + "</r>",
+         "attribute defaults too large at line 1"},
+        {"<r>\n" + repeated("<gen>40000000x 00 </gen>\n", 3) + "</r>", "binary data too large at line 3"},
+    };
+    for (const Case& c : cases) EXPECT_EQ(parseFailure(c.document), c.failure) << c.document.substr(0, 60);
+
+    XmlParser parser;
+    try {
+        parser.parseFile("/nowhere/a.xml");
+        FAIL();
+    } catch (const QvFileException& failure) {
+        EXPECT_STREQ(failure.what(), "Can not open file /nowhere/a.xml");
+    }
+}
+
+TEST(XmlParser, largeAndDeepDocumentsWithinTheLimits) {
+    const std::string name(1 << 20, 'n');
+    XmlParser parser;
+    EXPECT_EQ(parseFailure("<" + name + " a='" + name + "'/>", &parser), "");
+    EXPECT_EQ(parser.topLevel()->name(), name);
+    EXPECT_EQ(parser.topLevel()->getAttr("a").size(), 1 << 20);
+
+    const std::size_t depth = XmlParser::maxDepth;
+    EXPECT_EQ(parseFailure(repeated("<a>", depth) + repeated("</a>", depth), &parser), "");
+    const TempFolder folder;
+    EXPECT_EQ(XmlParser::storeXmlTree(folder.file("deep.xml").c_str(), parser.topLevel(), nullptr), 0);
+    EXPECT_EQ(parser.parseFile(folder.file("deep.xml").c_str()), 0);
+}
+
+TEST(XmlParser, storesWhatItCanReadAgain) {
+    const TempFolder folder;
+    const std::string file = folder.file("a.xml");
+    XmlNode root("r");
+    root.setAttr("v", "<&>\"'");
+    EXPECT_EQ(XmlParser::storeXmlTree(file.c_str(), &root, "r"), 0);
+    const std::string bytes = TempFolder::read(file);
+    EXPECT_EQ(bytes,
+              "<?xml version=\"1.0\" encoding=\"UTF-8\" ?>\n<!DOCTYPE r>\n"
+              "<r v=\"&lt;&amp;&gt;&quot;&apos;\"/>\n");
+    XmlParser parser;
+    parser.parseFile(Any(file.c_str()).toWString());
+    EXPECT_EQ(parser.topLevel()->getAttr("v"), root.getAttr("v"));
+
+    const auto storeFailure = [&](XmlNode* node, const std::string& to) -> std::string {
+        try {
+            XmlParser::storeXmlTree(to.c_str(), node, nullptr);
+            return "";
+        } catch (const QvFileException& failure) {
+            return failure.what();
+        }
+    };
+    for (const char* bad : {"", "a b", "1a", "a>", "-", "#x", "\xC3\x97", "\xFF"}) {
+        new XmlNode(bad, nullptr, &root);
+        EXPECT_EQ(storeFailure(&root, file), "Can not store '" + file + "': invalid name '" + bad + "'");
+        root.deleteChildren();
+    }
+    new XmlNode("\xC3\xA4", nullptr, &root);
+    EXPECT_EQ(storeFailure(&root, folder.file("name.xml")), "");
+    root.setAttr("a b", "x");
+    EXPECT_EQ(storeFailure(&root, file), "Can not store '" + file + "': invalid attribute 'a b'");
+    EXPECT_EQ(TempFolder::read(file), bytes);
+
+    XmlNode deep("a");
+    for (XmlNode* node = &deep; deep.nrChildren() < 1 || node->name()[0] != 'z';) {
+        static int count = 0;
+        node = new XmlNode(++count < 2000 ? "a" : "z", nullptr, node);
+    }
+    EXPECT_EQ(storeFailure(&deep, file), "Can not store '" + file + "': elements nested too deep");
+    EXPECT_EQ(storeFailure(&deep, "/nowhere/a.xml"),
+              "Can not store '/nowhere/a.xml': elements nested too deep");
+    XmlNode plain("plain");
+    EXPECT_EQ(storeFailure(&plain, "/nowhere/a.xml"), "Can not open '/nowhere/a.xml' for writing");
+    EXPECT_EQ(storeFailure(&plain, "/dev/full"), "Can not write '/dev/full'");
+}
+
+TEST(XmlParser, standardStreamsStayOpen) {
+    XmlNode root("shown");
+    testing::internal::CaptureStdout();
+    EXPECT_EQ(XmlParser::storeXmlTree("stdout", &root, nullptr), 0);
+    EXPECT_EQ(XmlParser::storeXmlTree("stdout", &root, nullptr), 0);
+    const std::string once = "<?xml version=\"1.0\" encoding=\"UTF-8\" ?>\n<shown/>\n";
+    EXPECT_EQ(testing::internal::GetCapturedStdout(), once + once);
+}
+
+}  // namespace
