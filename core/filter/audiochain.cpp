@@ -3,7 +3,7 @@
 #include <utility>
 
 #include "core/engine/qvutil.h"
-#include "core/filter/chainfilters.h"
+#include "core/filter/chainfilters_p.h"
 #include "core/filter/jobdescription.h"
 #include "core/filter/qvprocesspipe.h"
 #include "core/filter/qvprocessutil.h"

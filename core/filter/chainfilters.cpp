@@ -1,4 +1,4 @@
-#include "core/filter/chainfilters.h"
+#include "core/filter/chainfilters_p.h"
 
 #include <string>
 

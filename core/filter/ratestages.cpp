@@ -1,5 +1,5 @@
 // Which converters change a frame rate, and whether they may run before the scaler.
-#include "core/filter/chainfilters.h"
+#include "core/filter/chainfilters_p.h"
 #include "core/media/qvgeometry.h"
 #include "core/media/qvratio.h"
 

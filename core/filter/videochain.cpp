@@ -6,7 +6,7 @@
 #include "core/engine/qvregistry.h"
 #include "core/engine/qvutil.h"
 #include "core/engine/status.h"
-#include "core/filter/chainfilters.h"
+#include "core/filter/chainfilters_p.h"
 #include "core/filter/jobdescription.h"
 #include "core/filter/qvprocesspipe.h"
 #include "core/filter/qvprocessutil.h"

@@ -3,7 +3,7 @@
 
 #include "core/decode/qvdecoder.h"
 #include "core/encode/qvencodepipe.h"
-#include "core/engine/optionalparam.h"
+#include "core/engine/optionalparam_p.h"
 #include "core/engine/qvlog.h"
 #include "core/engine/qvutil.h"
 #include "core/filter/qvprocesspipe.h"

@@ -1,7 +1,7 @@
 // The video link: one step, from a decoder's frame to the encoder.
 #include "core/decode/qvdecoder.h"
 #include "core/encode/qvencodepipe.h"
-#include "core/engine/optionalparam.h"
+#include "core/engine/optionalparam_p.h"
 #include "core/engine/qvfileutil.h"
 #include "core/engine/qvmodule.h"
 #include "core/engine/qvregistry.h"
