@@ -69,10 +69,10 @@ bool TransALink::verifySource(const Any& source, int channel, int index) const {
             channel, from.stream, decoder_->nrAudioStreams());
         return false;
     }
-    const std::string name = "audio" + std::to_string(from.stream) + "/channels";
-    const Any channels = decoder_->getParam(name.c_str());
+    const Any name = Any::sprintf("audio%d/channels", from.stream);
+    const Any channels = decoder_->getParam(name.asString());
     if (!channels.isInt32()) {
-        qv_dbg()->debug("Invalid channel map at %d, %d, , can not get %s", channel, index, name.c_str());
+        qv_dbg()->debug("Invalid channel map at %d, %d, , can not get %s", channel, index, name.asString());
         return false;
     }
     if (from.channel < 0 || from.channel >= channels.asInt32()) {

@@ -18,6 +18,7 @@ template <class Base>
 class AnyParamFilter : public Base {
   public:
     using Base::Base;
+    using Base::getParam;
 
     int setParam(const char* name, const Any& value) override {
         if (name[0] == '_' && name != std::string("_needsReport")) seen.set(name, value);
@@ -96,13 +97,14 @@ class FakeAudioFilter : public AnyParamFilter<QvAudioFilter> {
         if (writeResult) return writeResult;
         if (!out.inited()) out.init(0, pcm.channels(), pcm.bytesPerSample(), pcm.samplerate());
         if (swallows || pcm.samples() == 0) return 0;
+        if (holdBack > 0) return delay(pcm);
         if (ratio == 1.0) return out.write(pcm.samples(), pcm.ptr(0));
         owed += pcm.samples() * ratio;
         const int count = static_cast<int>(owed);
         owed -= count;
         return out.addSilence(count);
     }
-    int samples() const override { return out.inited() ? std::max(out.samples() - holdBack, 0) : 0; }
+    int samples() const override { return out.samples(); }
     QvPcm* pcm() override { return &out; }
     int erase(int n) override { return out.erase(n); }
 
@@ -113,6 +115,17 @@ class FakeAudioFilter : public AnyParamFilter<QvAudioFilter> {
     int writeResult = 0;
     std::vector<int> written;
     QvPcm out;
+
+  private:
+    int delay(const QvPcm& pcm) {
+        if (!held.inited()) held.init(0, pcm.channels(), pcm.bytesPerSample(), pcm.samplerate());
+        held.write(pcm.samples(), pcm.ptr(0));
+        const int surplus = held.samples() - holdBack;
+        if (surplus < 1) return 0;
+        out.write(surplus, held.ptr(0));
+        return held.erase(surplus);
+    }
+    QvPcm held;
 };
 
 template <class Filter>
@@ -134,8 +147,12 @@ class FakePlugin {
         qv_registry()->addPlugin(plugin_.get());
     }
     ~FakePlugin() { qv_registry()->cleanup(); }
-    FakePlugin& video(const char* name) { return add(new FakeModule<FakeVideoFilter>(QvModuleType::videoFilter, name)); }
-    FakePlugin& audio(const char* name) { return add(new FakeModule<FakeAudioFilter>(QvModuleType::audioFilter, name)); }
+    FakePlugin& video(const char* name) {
+        return add(new FakeModule<FakeVideoFilter>(QvModuleType::videoFilter, name));
+    }
+    FakePlugin& audio(const char* name) {
+        return add(new FakeModule<FakeAudioFilter>(QvModuleType::audioFilter, name));
+    }
     FakePlugin& add(QvModule* module) {
         plugin_->addModule(module);
         return *this;

@@ -1,0 +1,197 @@
+#include "builtin/pipes/qvvideopipe.h"
+
+#include <gtest/gtest.h>
+
+#include <vector>
+
+#include "core/engine/qvexception.h"
+#include "core/engine/status.h"
+#include "tests/support/fake_filters.h"
+#include "tests/support/fake_streams.h"
+#include "tests/support/log_capture.h"
+
+namespace {
+
+QvFrame frameNr(int nr) {
+    QvFrame frame;
+    frame.init(QvFourcc::GRAY, 16, 8);
+    frame.frameNr = nr;
+    return frame;
+}
+
+class Named : public FakeVideoFilter {
+  public:
+    explicit Named(const char* name) : name_(name) {}
+    const char* name() const override { return name_; }
+
+  private:
+    const char* name_;
+};
+
+// A pipe of filters by name; "+" in front of it makes one that works in place.
+struct Pipe : QvVf {
+    explicit Pipe(std::initializer_list<const char*> names) {
+        for (const char* name : names) {
+            auto* filter = new Named(name[0] == '+' ? name + 1 : name);
+            filter->inPlace = name[0] == '+';
+            addFilter(filter, -1);
+        }
+        init();
+    }
+    FakeVideoFilter& at(int i) { return static_cast<FakeVideoFilter&>(*filter(i)); }
+    // The numbers of all frames that the pipe gives out for a decoder's.
+    std::vector<int> drain(QvDecodePipe& decoder) {
+        std::vector<int> numbers;
+        while (process(&decoder, 0) == 0) {
+            numbers.push_back(frame()->frameNr);
+            next();
+        }
+        return numbers;
+    }
+};
+
+TEST(VideoPipe, WithoutFiltersAFramePassesThrough) {
+    Pipe pipe({});
+    EXPECT_EQ(pipe.open(), 0);
+    EXPECT_EQ(pipe.ready(), 0);
+    EXPECT_EQ(pipe.process(nullptr, 0), -1);
+    QvFrame frame = frameNr(7);
+    EXPECT_EQ(pipe.write(frame), 0);
+    EXPECT_EQ(pipe.ready(), 1);
+    EXPECT_EQ(pipe.frame()->frameNr, 7);
+    EXPECT_EQ(pipe.next(), 0);
+    EXPECT_EQ(pipe.ready(), 0);
+    EXPECT_EQ(pipe.framesIn(), 1u);
+    EXPECT_EQ(pipe.close(), 0);
+}
+
+TEST(VideoPipe, PositionsAndNames) {
+    Pipe pipe({"a", "b"});
+    pipe.addFilter(new Named("c"), 0);
+    pipe.addFilter(new Named("d"), -5);
+    pipe.addFilter(new Named("a"), 99);
+    ASSERT_EQ(pipe.nrFilters(), 5);
+    const char* order[] = {"c", "a", "b", "d", "a"};
+    for (int i = 0; i < 5; ++i) EXPECT_STREQ(pipe.filter(i)->name(), order[i]);
+    EXPECT_EQ(pipe.filter("a", 1), pipe.filter(4));
+    EXPECT_EQ(pipe.filter("a", 2), nullptr);
+    EXPECT_EQ(pipe.filter("z", 0), nullptr);
+    EXPECT_EQ(pipe.filter(-1), nullptr);
+    EXPECT_EQ(pipe.removeFilter(1), 0);
+    EXPECT_EQ(pipe.filter("a", 0), pipe.filter(3));
+    EXPECT_THROW(pipe.removeFilter(4), QvAssertFailure);
+    EXPECT_THROW(pipe.removeFilter(-1), QvAssertFailure);
+    pipe.clear();
+    EXPECT_EQ(pipe.nrFilters(), 0);
+}
+
+TEST(VideoPipe, GroupsInPlaceFiltersWithTheirHead) {
+    struct Row {
+        std::vector<const char*> filters;
+        const char* line;
+        bool safe;
+    };
+    const Row rows[] = {
+        {{"a", "+b", "+c", "d"}, "VideoProcessingPipe: a:b:c->d", false},
+        {{"+a", "+b"}, "VideoProcessingPipe: a:b", false},
+        {{"a", "frconvert", "+b", "+c"}, "VideoProcessingPipe: a->frconvert->b:c", false},
+        {{"a", "frconvert", "+b"}, "VideoProcessingPipe: a->frconvert:b", true},
+    };
+    for (const auto& row : rows) {
+        LogCapture log;
+        Pipe pipe({});
+        for (const char* name : row.filters) {
+            auto* filter = new Named(name[0] == '+' ? name + 1 : name);
+            filter->inPlace = name[0] == '+';
+            if (row.safe) filter->known.set("_safeToApplyAfter", 1);
+            pipe.addFilter(filter, -1);
+        }
+        EXPECT_EQ(pipe.init(), 0);
+        EXPECT_EQ(pipe.open(), 0);
+        EXPECT_EQ(pipe.open(), 0);  // an open pipe stays as it is
+        EXPECT_EQ(log.texts().back(), row.line);
+    }
+}
+
+TEST(VideoPipe, EveryFrameLeavesOnceAndInPlaceFiltersSeeEach) {
+    FakeDecoder decoder(6, QvFramerate::f25p());
+    Pipe pipe({"head", "+inplace", "double", "+late"});
+    pipe.at(2).copies = [](int) { return 2; };
+    ASSERT_EQ(pipe.open(), 0);
+    EXPECT_EQ(pipe.drain(decoder), (std::vector<int>{0, 0, 1, 1, 2, 2, 3, 3, 4, 4, 5, 5}));
+    EXPECT_EQ(pipe.at(1).applied, (std::vector<int>{0, 1, 2, 3, 4, 5}));
+    EXPECT_EQ(pipe.at(3).applied.size(), 12u);
+    EXPECT_EQ(pipe.framesIn(), 6u);
+    EXPECT_EQ(pipe.framesOut(), 12u);
+}
+
+TEST(VideoPipe, DropsAndRepeatsThroughSeveralGroups) {
+    FakeDecoder decoder(9, QvFramerate::f25p());
+    Pipe pipe({"third", "double", "plain"});
+    pipe.at(0).copies = [](int nr) { return nr % 3 == 0 ? 1 : 0; };
+    pipe.at(1).copies = [](int) { return 2; };
+    ASSERT_EQ(pipe.open(), 0);
+    EXPECT_EQ(pipe.drain(decoder), (std::vector<int>{0, 0, 3, 3, 6, 6}));
+    EXPECT_EQ(decoder.read, 9);
+}
+
+TEST(VideoPipe, ReadsNoFurtherThanItMust) {
+    FakeDecoder decoder(9, QvFramerate::f25p());
+    Pipe pipe({"a", "double", "c"});
+    pipe.at(1).copies = [](int) { return 2; };
+    ASSERT_EQ(pipe.open(), 0);
+    EXPECT_EQ(pipe.process(nullptr, 0), QvStatus::needsInput);
+    EXPECT_EQ(pipe.process(&decoder, 0), 0);
+    pipe.next();
+    EXPECT_EQ(pipe.process(nullptr, 0), 0);  // the second copy was under way
+    pipe.next();
+    EXPECT_EQ(pipe.process(nullptr, 0), QvStatus::needsInput);
+    EXPECT_EQ(decoder.read, 1);
+}
+
+TEST(VideoPipe, PassesTheDecodersErrorOn) {
+    FakeDecoder decoder(9, QvFramerate::f25p());
+    decoder.failAt = 1;
+    Pipe pipe({"a"});
+    ASSERT_EQ(pipe.open(), 0);
+    EXPECT_EQ(pipe.process(&decoder, 0), 0);
+    pipe.next();
+    EXPECT_EQ(pipe.process(&decoder, 0), -1);
+    decoder.failAt = -1;
+    decoder.next = 9;
+    EXPECT_EQ(pipe.process(&decoder, 0), QvStatus::endOfStream);
+}
+
+TEST(VideoPipe, AnEmptyFrameIsIgnoredAndAnUnreadOneAsserts) {
+    Pipe pipe({"a"});
+    QvFrame frame = frameNr(3);
+    EXPECT_EQ(pipe.write(frame), QvStatus::illegalState);
+    ASSERT_EQ(pipe.open(), 0);
+    QvFrame empty;
+    EXPECT_EQ(pipe.write(empty), 0);
+    EXPECT_EQ(pipe.framesIn(), 0u);
+    EXPECT_EQ(pipe.write(frame), 0);
+    try {
+        pipe.write(frame);
+        FAIL() << "an unread frame was lost";
+    } catch (const QvAssertFailure& failure) {
+        EXPECT_STREQ(failure.what(), "*** Assertion failed at builtin/qvvideopipe(362)");
+    }
+}
+
+TEST(VideoPipe, OpeningStopsAtTheFirstFailure) {
+    LogCapture log;
+    Pipe pipe({"a", "b", "c"});
+    pipe.at(1).openResult = -3;
+    EXPECT_EQ(pipe.open(), -3);
+    EXPECT_TRUE(log.contains("[video pipe] open error"));
+    EXPECT_EQ(pipe.at(0).getState(), 3);
+    EXPECT_NE(pipe.at(2).getState(), 3);
+    EXPECT_EQ(pipe.close(), 0);
+    EXPECT_EQ(pipe.at(0).closed, 1);
+    pipe.at(1).openResult = 0;
+    EXPECT_EQ(pipe.open(), 0);
+    EXPECT_EQ(pipe.ready(), 0);
+}
+
+}  // namespace

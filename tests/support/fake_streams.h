@@ -1,0 +1,260 @@
+// A source and an output for tests of links: every frame and sample that passes is written down.
+#pragma once
+
+#include <algorithm>
+#include <cstring>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "core/decode/qvdecoder.h"
+#include "core/encode/qvencodepipe.h"
+#include "core/engine/status.h"
+#include "core/media/qvbuffer.h"
+
+// One video stream and any number of audio streams. Frames are GRAY, numbered from 0; 16-bit samples count up
+// from 1, the same in every channel.
+class FakeDecoder : public QvDecodePipe {
+  public:
+    FakeDecoder(int frames, const QvFramerate& rate, int width = 16, int height = 8) {
+        video.set("framerate", rate);
+        video.set("frames", frames);
+        video.set("width", width);
+        video.set("height", height);
+        video.set("FOURCC", static_cast<int>(QvFourcc::GRAY));
+        video.set("frameAspect", 1.0);
+        setState(stateInitialised);
+    }
+    FakeDecoder& audio(long long samples, int samplerate, int channels = 2) {
+        AnyDict params("samplerate", samplerate, "channels", channels, "bitsPerSample", 16, "bytesPerSample",
+                       2, "codec", "PCM");
+        if (samples >= 0) params.set("samples", samples);
+        auto track = std::make_unique<Track>();
+        track->params = params;
+        track->total = samples >= 0 ? samples : (1LL << 40);
+        track->pcm.init(0, channels, 2, samplerate);
+        tracks.push_back(std::move(track));
+        return *this;
+    }
+
+    int nrStreams(int type) const override {
+        return type == 1 ? 1 : type == 2 ? static_cast<int>(tracks.size()) : 0;
+    }
+    void getStreamParams(int type, int stream, AnyDict& out) const override {
+        out = type == 1 ? video : tracks.at(static_cast<std::size_t>(stream))->params;
+    }
+    void getParam(const char* name, Any& value) const override {
+        if (extra.isSet(name))
+            value = extra.get(name);
+        else
+            QvDecodePipe::getParam(name, value);
+    }
+    int setParam(const char* name, const Any& value) override {
+        set.set(name, value);
+        return 0;
+    }
+    int seekToFrame(long long frame, int) override {
+        next = static_cast<int>(frame);
+        return 0;
+    }
+    int seekToSample(long long sample, int stream) override {
+        tracks.at(static_cast<std::size_t>(stream))->position = sample;
+        return 0;
+    }
+    int readFrame(int) override {
+        if (next == failAt) return setError(-1, "the disc is gone");
+        if (next >= available()) return QvStatus::endOfStream;
+        if (!frame.inited()) frame.init(QvFourcc::GRAY, video.getInt32("width"), video.getInt32("height"));
+        frame.framerate = video.get("framerate").asFramerate();
+        frame.frameNr = next++;
+        ++read;
+        return 0;
+    }
+    int readSamples(int count, int stream) override {
+        auto& track = *tracks.at(static_cast<std::size_t>(stream));
+        requests.push_back(count);
+        const int n = static_cast<int>(std::min<long long>(count, track.total - track.position));
+        track.pcm.setSamples(0);
+        if (n < 1) return QvStatus::endOfStream;
+        if (track.pcm.size() < n) track.pcm.init(n, track.pcm.channels(), 2, track.pcm.samplerate());
+        track.pcm.setSamples(n);
+        auto* value = reinterpret_cast<short*>(track.pcm.ptr(0));
+        for (int i = 0; i < n; ++i)
+            for (int c = 0; c < track.pcm.channels(); ++c)
+                *value++ = static_cast<short>((track.position + i) % 1000 + 1);
+        track.position += n;
+        return n;
+    }
+    int nrFrames(int) const override { return video.getInt32("frames"); }
+    long long nrSamples(int stream) const override {
+        return tracks.at(static_cast<std::size_t>(stream))->total;
+    }
+    int readMeta(int, int, AnyDict& out) override {
+        if (captionEvery == 0 || (next - 1) % captionEvery != 0) return -1;
+        out.clear();
+        out.set("captions", next - 1);
+        return 0;
+    }
+    QvFrame* getFramePtr(int) override { return &frame; }
+    QvPcm* getAudioPtr(int stream) override { return &tracks.at(static_cast<std::size_t>(stream))->pcm; }
+    int select(int, int) override { return 0; }
+    int deselect(int, int) override { return 0; }
+    int selected(AnyDict&) const override { return 0; }
+    bool isSelected(int, int) const override { return isOn; }
+
+    struct Track {
+        AnyDict params;
+        long long total = 0;
+        long long position = 0;
+        QvPcm pcm;
+    };
+    int available() const { return truncatedAt >= 0 ? truncatedAt : video.getInt32("frames"); }
+
+    AnyDict video;
+    AnyDict extra;  // answers of getParam
+    AnyDict set;    // what setParam got
+    std::vector<std::unique_ptr<Track>> tracks;
+    std::vector<int> requests;
+    QvFrame frame;
+    int next = 0;
+    int read = 0;
+    int truncatedAt = -1;
+    int failAt = -1;
+    int captionEvery = 0;
+    bool isOn = true;
+};
+
+template <class Base>
+class FakeEncoder : public Base {
+  public:
+    int setParam(const char* name, const Any& value) override {
+        if (refused.isSet(name)) return Base::setParam("unknown", value);
+        params.set(name, value);
+        return 0;
+    }
+    void getParam(const char* name, Any& value) const override {
+        if (params.isSet(name))
+            value = params.get(name);
+        else
+            Base::getParam(name, value);
+    }
+    int open() override { return 0; }
+    int close() override { return 0; }
+
+    AnyDict params;
+    AnyDict refused;  // names that it does not know
+    int result = 0;
+};
+
+class FakeVideoEncoder : public FakeEncoder<QvVideoEncoder> {
+  public:
+    int writeFrame(QvFrame* frame) override {
+        numbers.push_back(frame ? frame->frameNr : -1);
+        addresses.push_back(frame);
+        captions.push_back(frame && frame->subpic() ? frame->subpic()->getInt32("captions", -2) : -1);
+        return result;
+    }
+    QvFrame* lastFrame() override { return nullptr; }
+
+    std::vector<int> numbers;
+    std::vector<QvFrame*> addresses;
+    std::vector<int> captions;
+};
+
+class FakeAudioEncoder : public FakeEncoder<QvAudioEncoder> {
+  public:
+    int writePcm(QvPcm* pcm, int samples) override {
+        const int count = samples < 0 && pcm ? pcm->samples() : samples;
+        counts.push_back(count);
+        total += count;
+        addresses.push_back(pcm);
+        if (!pcm) return result;
+        for (int i = 0; i < count; ++i) {
+            short value = 0;
+            std::memcpy(&value, pcm->ptr(i),
+                        std::min<std::size_t>(sizeof value, static_cast<std::size_t>(pcm->bytesPerSample())));
+            values.push_back(value);
+        }
+        return result;
+    }
+
+    std::vector<int> counts;
+    std::vector<QvPcm*> addresses;
+    std::vector<int> values;  // of the first channel
+    long long total = 0;
+};
+
+// One video and any number of audio encoders, without multiplexer and sink.
+class FakeEncodePipe : public QvEncodePipe {
+  public:
+    FakeEncodePipe(const QvFramerate& rate, int width = 16, int height = 8) {
+        video.params.set("framerate", rate);
+        video.params.set("width", width);
+        video.params.set("height", height);
+        video.params.set("inFOURCC", AnyVector(Any(static_cast<int>(QvFourcc::GRAY))));
+    }
+    FakeEncodePipe& audio(int samplerate, int channels = 2, int bits = 16) {
+        audios.push_back(std::make_unique<FakeAudioEncoder>());
+        auto& params = audios.back()->params;
+        params.set("samplerate", samplerate);
+        params.set("channels", channels);
+        params.set("bitsPerSample", bits);
+        return *this;
+    }
+
+    int setParam(const char* name, const Any& value) override {
+        set.set(name, value);
+        return 0;
+    }
+    void getParam(const char* name, Any& value) const override {
+        const std::string full = name;
+        const auto slash = full.find('/');
+        if (slash == std::string::npos) return;
+        const QvCodec* target = &video;
+        if (full[0] == 'a') target = audios.at(static_cast<std::size_t>(full[5] - '0')).get();
+        target->getParam(full.c_str() + slash + 1, value);
+    }
+    int open() override { return 0; }
+    int close() override { return 0; }
+    int abort() override { return 0; }
+    int writeFrame(QvFrame* frame, int) override { return video.writeFrame(frame); }
+    int writePcm(QvPcm* pcm, int stream) override { return audioEncoder(stream)->writePcm(pcm); }
+    int applyPreset(const QvPreset&, int) override { return -1; }
+    int applyPreset(int, int) override { return -1; }
+    void storePreset(AnyDict&) const override {}
+    const QvPreset* activePreset() const override { return nullptr; }
+    int nrStreams(int mask) const override {
+        return (mask & 1 ? videoStreams : 0) + (mask & 2 ? static_cast<int>(audios.size()) : 0);
+    }
+    QvOStream* stream(int, int) const override { return nullptr; }
+    QvOStream* streamAt(int) const override { return nullptr; }
+    TPtrList<QvOStream> streams(int) const override { return {}; }
+    int indexOf(QvOStream*) const override { return -1; }
+    int streamNr(QvOStream*) const override { return -1; }
+    int addStream(int, const Any&) override { return -1; }
+    void removeStream(QvOStream*) override {}
+    void removeStream(int, int) override {}
+    void removeStreams(int) override {}
+    int setCodec(int, int, const char*, const AnyDict&) override { return -1; }
+    QvEncoder* encoder(int type, int nr) const override {
+        if (type == 1) return videoEncoder(nr);
+        return audioEncoder(nr);
+    }
+    QvEncoder* encoder(int) const override { return nullptr; }
+    QvVideoEncoder* videoEncoder(int) const override { return const_cast<FakeVideoEncoder*>(&video); }
+    QvAudioEncoder* audioEncoder(int nr) const override {
+        return audios.at(static_cast<std::size_t>(nr)).get();
+    }
+    int setMuxer(const char*) override { return -1; }
+    QvMuxer* getMuxer() const override { return muxer; }
+    void setCreateOutFolder(bool) override {}
+    bool createOutFolder() const override { return false; }
+    int setSink(const char*) override { return -1; }
+    QvSink* sink() const override { return nullptr; }
+
+    FakeVideoEncoder video;
+    std::vector<std::unique_ptr<FakeAudioEncoder>> audios;
+    AnyDict set;
+    QvMuxer* muxer = nullptr;
+    int videoStreams = 1;
+};
