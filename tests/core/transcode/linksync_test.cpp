@@ -2,7 +2,10 @@
 // that belong to the frames written so far.
 #include <gtest/gtest.h>
 
+#include <memory>
+
 #include "builtin/modules.h"
+#include "core/decode/qvtestgenerator.h"
 #include "core/filter/qvprocesspipe.h"
 #include "core/transcode/translink.h"
 #include "tests/support/fake_filters.h"
@@ -64,5 +67,47 @@ TEST_P(LinkSync, AudioHoldsTheSamplesOfTheFramesWritten) {
 
 INSTANTIATE_TEST_SUITE_P(Rates, LinkSync, testing::ValuesIn(rows),
                          [](const auto& info) { return std::string(info.param.name); });
+
+// The example that the tool shows, but for the size of its pictures.
+TEST(LinkSyncOfTheGenerator, FourSecondsOfNtsc) {
+    FakePlugin plugin;
+    plugin.add(new TestGeneratorModule);
+    GeneratorVParams picture;
+    picture.duration = MediaTime(4.0);
+    picture.framerate = QvFramerate(30000.0 / 1001);
+    picture.width = 64;
+    picture.height = 48;
+    GeneratorAParams beep;
+    beep.duration = MediaTime(4.0);
+    std::unique_ptr<QvDecodePipe> source(QvTestGenerator::create(&picture, &beep));
+    ASSERT_TRUE(source);
+    ASSERT_EQ(source->open(), 0);
+    source->select(1, 0);
+    source->select(2, 0);
+    FakeEncodePipe encoder(QvFramerate::f29p(), 64, 48);
+    encoder.video.params.set("inFOURCC", AnyVector(Any(static_cast<int>(QvFourcc::BGR4))));
+    encoder.audio(44100);
+    TransVLink video;
+    TransALink audio;
+    ASSERT_EQ(video.init(source.get(), 0, &encoder, 0), 0);
+    ASSERT_EQ(audio.init(source.get(), 0, &encoder, 0), 0);
+    ASSERT_EQ(video.open(nullptr), 0);
+    ASSERT_EQ(audio.open(nullptr), 0);
+    EXPECT_EQ(video.totalOutFrames(), 119);
+    EXPECT_EQ(audio.totalOutSamples(), 176400);
+    while (!video.finished()) {
+        ASSERT_EQ(video.processFrame(0), 0);
+        const int written = static_cast<int>(video.outProcessed());
+        const long long due = audio.outSamplesPerFrames(written, video.outFramerate());
+        ASSERT_EQ(audio.processFrame(static_cast<int>(due - audio.outProcessed())), 0);
+    }
+    EXPECT_EQ(encoder.video.numbers.size(), 119u);
+    EXPECT_EQ(encoder.video.numbers.back(), 118);
+    EXPECT_EQ(encoder.audios.front()->total, 175104);
+    EXPECT_FALSE(audio.finished());
+    video.close();
+    audio.close();
+    source.reset();
+}
 
 }  // namespace
