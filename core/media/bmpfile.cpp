@@ -49,7 +49,7 @@ Header headerOf(const QvFrame& frame) {
 }
 
 bool write(std::FILE* file, const unsigned char* bytes, std::size_t count) {
-    return std::fwrite(bytes, 1, count, file) == count;
+    return count == 0 || std::fwrite(bytes, 1, count, file) == count;
 }
 
 }  // namespace

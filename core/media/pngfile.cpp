@@ -15,7 +15,8 @@
 namespace {
 
 constexpr int signatureBytes = 8;
-constexpr png_uint_32 maxSide = 32768;
+// Deflate makes one byte out of at least 1/1032: what an image of a given size must take in its file.
+constexpr unsigned long long maxInflation = 1032;
 constexpr int fillerValue = 255;
 
 struct Message {
@@ -61,12 +62,15 @@ struct ImageHead {
 };
 
 // After this libpng delivers four bytes a pixel, B G R and alpha, whatever the file holds.
-bool readHeadJumping(png_structp png, png_infop info, std::FILE* file, ImageHead* head) {
+// An image that its file can't hold, by its length, is an error: it would only take memory.
+bool readHeadJumping(png_structp png, png_infop info, std::FILE* file, unsigned long long fileBytes,
+                     ImageHead* head) {
     if (setjmp(png_jmpbuf(png))) return false;
     png_init_io(png, file);
     png_set_sig_bytes(png, signatureBytes);
-    png_set_user_limits(png, maxSide, maxSide);
     png_read_info(png, info);
+    if (1ULL * png_get_rowbytes(png, info) * png_get_image_height(png, info) / maxInflation > fileBytes)
+        png_error(png, "file too short for its image");
     png_set_strip_16(png);
     png_set_expand(png);
     png_set_gray_to_rgb(png);
@@ -138,6 +142,15 @@ void splitAlpha(const ImageHead& head, QvFrame& picture, QvFrame* alpha) {
     }
 }
 
+// Length of a file; of a pipe, which has none, the largest there is.
+unsigned long long bytesOf(std::FILE* file) {
+    const long at = std::ftell(file);
+    if (at < 0 || std::fseek(file, 0, SEEK_END) != 0) return ~0ULL;
+    const long end = std::ftell(file);
+    std::fseek(file, at, SEEK_SET);
+    return end < 0 ? ~0ULL : static_cast<unsigned long long>(end);
+}
+
 }  // namespace
 
 bool qvIsPng(std::FILE* file) {
@@ -149,7 +162,7 @@ bool qvIsPng(std::FILE* file) {
 int qvReadPng(std::FILE* file, const char* name, QvFrame& picture, QvFrame* alpha) {
     Reader reader;
     ImageHead head;
-    if (!reader.info || !readHeadJumping(reader.png, reader.info, file, &head)) {
+    if (!reader.info || !readHeadJumping(reader.png, reader.info, file, bytesOf(file), &head)) {
         qv_log()->warning("Can not read %s: %s", name, reader.message.text);
         return QvStatus::ok;
     }
