@@ -303,9 +303,10 @@ AnyVector qvDescribeParamRows(std::span<const QvParamRow<T>> rows, const T& defa
 template <class T>
 std::optional<int> QvCodec::_setRow(std::span<const QvParamRow<T>> rows, T& object, const char* name,
                                     const Any& value) {
-    const std::optional<int> result = qvSetParamRow(rows, object, name, value);
-    if (!result) return result;
+    const auto* row = qvFindParamRow(rows, name);
+    if (!row || (row->flags & qvParamReadOnly)) return std::nullopt;
     _traceParam(name, value);
-    if (*result == QvStatus::invalidParam) setError(*result, "%s", qvParamRefusal(rows, name, value).c_str());
+    const std::optional<int> result = qvSetParamRow(rows, object, name, value);
+    if (result == QvStatus::invalidParam) setError(*result, "%s", qvParamRefusal(rows, name, value).c_str());
     return result;
 }

@@ -57,7 +57,10 @@ int QvCodec::init() {
     return QvStatus::ok;
 }
 
-int QvCodec::setParam(const char* name, const Any&) { return _raiseInvalidParam(name); }
+int QvCodec::setParam(const char* name, const Any& value) {
+    _traceParam(name, value);
+    return _raiseInvalidParam(name);
+}
 
 void QvCodec::getParam(const char* name, Any& value) const {
     if (Any(name ? name : "") == "displayName") {

@@ -35,8 +35,8 @@ class QV_API QvCodec {
 
     // State 1 becomes 2. In any other state -1 with the text "Already initialized".
     virtual int init();
-    // An implementation traces the call with _traceParam, takes the names it knows and gives all others to
-    // its base. This one knows none: the invalid parameter failure.
+    // An implementation traces and takes the names it knows and gives all others to its base, so that each
+    // call is traced once. This one knows none: the invalid parameter failure.
     virtual int setParam(const char* name, const Any& value) = 0;
     // `value` comes in invalid; an implementation writes it if it knows the name and otherwise asks its base.
     // This one knows "displayName", which is deprecated, and warns if `value` has been written already.
@@ -82,8 +82,8 @@ class QV_API QvCodec {
     int _setErr(int code, const char* format, ...) QV_PRINTF(3, 4);
     // The invalid parameter failure: throws QvParamException, or returns QvStatus::invalidParam.
     int _raiseInvalidParam(const char* name) const;
-    // First act of every setParam: logs name and value, unless the codec is still in state 1 or the debug
-    // option "log_setparam" is off.
+    // First act of the setParam that takes a name (_setRow does it too): logs name and value, unless the
+    // codec is still in state 1 or the debug option "log_setparam" is off.
     void _traceParam(const char* name, const Any& value) const;
     // For parameters that are rows over typed fields ("core/engine/params.h", which defines it): traces the
     // call and sets the row's field. nullopt: no row takes this name. A refused value leaves its field alone

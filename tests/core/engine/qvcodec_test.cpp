@@ -25,8 +25,8 @@ class Gain : public QvCodec {
 
     explicit Gain(const QvModule* module = nullptr) : QvCodec(module) {}
     int setParam(const char* name, const Any& value) override {
-        _traceParam(name, value);
         if (name == Any("gain") && value.isInt32()) {
+            _traceParam(name, value);
             gain_ = value.asInt32();
             return 0;
         }
@@ -159,11 +159,16 @@ TEST(Codec, TracesParametersOnceItIsSetUp) {
     EXPECT_TRUE(log.lines().empty());
     codec->init();
     codec->setParam("gain", 2);
-    EXPECT_EQ(log.texts(), std::vector<std::string>{"gain.setParam: gain [Int32]             = 2"});
+    EXPECT_THROW(codec->setParam("other", "x"), QvParamException);
+    EXPECT_EQ(log.texts(), (std::vector<std::string>{
+                               "gain.setParam: gain [Int32]             = 2",
+                               "gain.setParam: other [String]           x",
+                               "Exception: gain::setParam - invalid parameter \"other\"",
+                           }));
     qv_registry()->setDbgOption("log_setparam", 0);
     codec->setParam("gain", 3);
     qv_registry()->setDbgOption("log_setparam", 1);
-    EXPECT_EQ(log.lines().size(), 1u);
+    EXPECT_EQ(log.lines().size(), 3u);
 }
 
 TEST(Codec, WithoutModule) {
