@@ -26,7 +26,7 @@ void copyPixels(const QvFrame& from, QvFrame& to) {
 
 int VideoGenerator::init(const AnyDict& dict) {
     takeFramerate(dict["framerate"]);
-    if (!dict.isSet("picture")) {
+    if (!dict["picture"].isValid()) {
         if (!addPlain(dict)) return QvStatus::invalidStructure;
     } else {
         addPictures(dict);
@@ -35,8 +35,6 @@ int VideoGenerator::init(const AnyDict& dict) {
     takeAspect(dict["frameAspect"].isFloat() ? dict["frameAspect"].asDouble() : 0);
     QV_ASSERT_MSG(takeDuration(dict, "frames", framerate_), "testgen: duration not set");
     countFrames();
-    const Any& perPic = dict["framesPerPic"];
-    framesPerPic_ = perPic.isInt() ? perPic.toInt32() : frames_ / static_cast<int>(pictures_.size());
     describe();
 
     pictures_.front()->frameNr = 0;

@@ -30,7 +30,6 @@ class VideoGenerator : public GeneratorStream {
     using Frames = std::vector<std::unique_ptr<QvFrame>>;
 
     int frames_ = 0;
-    int framesPerPic_ = 0;
     double frameAspect_ = 0;
     double pixelAspect_ = 0;
     QvFramerate framerate_;

@@ -195,4 +195,19 @@ TEST_F(Factory, RestoringNeedsNameModuleAndFile) {
     EXPECT_EQ(generator->nrFrames(0), 25);
 }
 
+TEST_F(Factory, EncodePipesComeFromTheirModule) {
+    const std::unique_ptr<QvEncodePipe> pipe(QvEncFactory::encodePipe(AnyDict("ignored", 1)));
+    ASSERT_TRUE(pipe);
+    EXPECT_STREQ(pipe->name(), "encpipe");
+    EXPECT_EQ(pipe->getState(), 2);
+}
+
+TEST_F(Factory, NoEncodePipeWithoutItsModule) {
+    cleanup_wrapper();
+    LogCapture late;
+    EXPECT_FALSE(QvEncFactory::encodePipe());
+    EXPECT_TRUE(
+        late.contains("[QvEncFactory]Internal error, there is no encode pipe module", QvLogMask::error));
+}
+
 }  // namespace
