@@ -25,16 +25,17 @@ void require(bool holds) {
 }  // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
-    static const std::string name = scratchFile();
-    std::FILE* const file = std::fopen(name.c_str(), "wb");
+    static const std::string scratch = scratchFile();
+    std::FILE* const file = std::fopen(scratch.c_str(), "wb");
     require(file && std::fwrite(data, 1, size, file) == size && std::fclose(file) == 0);
 
     QvIniParser ini;
-    const int status = ini.load(Any(name.c_str()), nullptr);
+    const int status = ini.load(Any(scratch.c_str()), nullptr);
     require(status == 0 || status == -15);
     require(status == 0 || ini.errors().size() > 0);
     for (int i = 0; i < ini.nrSections(); ++i) {
-        const char* const section = ini.section(i).asString();
+        const Any name = ini.section(i);
+        const char* const section = name.asString();
         AnyDict items;
         require(ini.getSectionItems(section, &items) == 0);
         for (const auto [key, value] : items) {
