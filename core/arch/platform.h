@@ -64,8 +64,9 @@ class QV_API QvPlatform {
     virtual int removeFolder(const char* name);  // an empty one
     // Success too if the folder is there already, made by another process in between.
     virtual int makeFolder(const char* name);
-    // Renames, or copies and removes where the two lie on different discs; the target never shows half a
-    // file. An existing target is replaced in one step with `replace`, and is a failure without.
+    // Renames; where the two lie on different discs copies a file and removes it, and refuses a folder. The
+    // target never shows half a file. An existing target is replaced in one step with `replace`, and is a
+    // failure without.
     virtual int moveFile(const char* from, const char* to, bool replace);
     // Appends all entries, "." and ".." included, in byte order of their names. Does not touch the
     // process's current folder.
@@ -96,8 +97,8 @@ class QV_API QvPlatform {
     virtual void unloadLibrary(void* library);
     virtual std::string coreLibraryPath();  // full name of the file that holds the engine
     // Gives `command` to the shell and waits for its end without limit. The result is the exit code, 128 plus
-    // the signal's number if a signal ended it, or -1 if it can't be started. The command reads nothing from
-    // this process's standard input.
+    // the signal's number if a signal ended it, or -1 if it can't be started or its end can't be learned. The
+    // command reads nothing from this process's standard input.
     virtual int runCommand(const char* command);
 
     // --- Threads and time ------------------------------------------------------------------------------

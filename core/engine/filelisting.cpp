@@ -55,10 +55,14 @@ template <class Take>
 void listMatching(const Any& folder, const char* ext, AnyVector* out, Take take) {
     out->clear();
     const std::string pattern = std::string("*") + (ext ? ext : "");
-    const auto names = namesIn(
-        folder, [&](const QvFolderEntry& entry) { return matches(entry.name, pattern) && take(entry); });
+    bool matched = false;
+    const auto names = namesIn(folder, [&](const QvFolderEntry& entry) {
+        if (!matches(entry.name, pattern)) return false;
+        matched = true;
+        return static_cast<bool>(take(entry));
+    });
     if (!names) return;
-    if (names->empty())
+    if (!matched)
         qv_dbg()->log(QvLogMask::debug, "get_folder_files_by_ext%c - no files found: %s",
                       folder.isWString() ? 'W' : 'A', pattern.c_str());
     const std::string start = qv_os_name(folder) + path_separator();

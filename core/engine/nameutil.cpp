@@ -1,5 +1,6 @@
 // Names: what other units ask of QvUtil instead of QvFile, and names that the engine makes up.
 #include <cstdlib>
+#include <random>
 
 #include "core/arch/platform.h"
 #include "core/engine/nametext_p.h"
@@ -13,10 +14,13 @@ Any QvUtil::getBasename(const Any& name) { return QvFile::getBasename(name); }
 Any QvUtil::getPath(const Any& name) { return QvFile::getPath(name); }
 bool QvUtil::isAbsolutePath(const Any& name) { return QvFile::isAbsolutePath(name); }
 
+// From the system's entropy: two processes that start in one second must not meet in one folder.
 Any QvUtil::makeMetaName(const Any& folder) {
+    std::random_device entropy;
+    std::uniform_int_distribution<int> number(0, RAND_MAX);
     const long long seconds = qv_platform().systemNs() / 1'000'000'000;
     const std::string name = qv_os_name(folder) + path_separator() + "Tarsel_metadata_" +
-                             std::to_string(std::rand()) + "_" + std::to_string(seconds);
+                             std::to_string(number(entropy)) + "_" + std::to_string(seconds);
     return qv_any_name(name, folder);
 }
 

@@ -99,9 +99,9 @@ bool QvFile::isDir(const Any& name) {
 }
 
 long long QvFile::flength(const Any& name) {
-    if (!name.isText()) return -1;
-    const std::string file = qv_os_name(name);
-    std::FILE* const stream = file.empty() ? nullptr : qv_platform().openFile(file.c_str(), "rb");
+    QvFileStatus status;
+    if (!statusOf(name, status) || !status.isRegular) return -1;  // opening a pipe would wait for its writer
+    std::FILE* const stream = qv_platform().openFile(qv_os_name(name).c_str(), "rb");
     if (!stream) return -1;
     const long long length = flength(stream);
     std::fclose(stream);

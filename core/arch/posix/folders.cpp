@@ -5,6 +5,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 #include <algorithm>
+#include <cerrno>
 #include <memory>
 
 namespace {
@@ -65,12 +66,18 @@ int QvPlatform::listFolder(const char* folder, std::vector<QvFolderEntry>& entri
     const Dir stream(opendir(folder));
     if (!stream) return -1;
     const auto first = static_cast<std::ptrdiff_t>(entries.size());
+    errno = 0;
     while (const dirent* entry = readdir(stream.get())) {
         // Some file systems don't tell the type, and a link has that of what it leads to.
         const bool asks = entry->d_type == DT_UNKNOWN || entry->d_type == DT_LNK;
         const bool isFolder =
             asks ? leadsToFolder(dirfd(stream.get()), entry->d_name, 0) : entry->d_type == DT_DIR;
         entries.push_back({entry->d_name, isFolder});
+        errno = 0;
+    }
+    if (errno != 0) {  // half a listing would look whole
+        entries.resize(static_cast<std::size_t>(first));
+        return -1;
     }
     std::sort(entries.begin() + first, entries.end(),
               [](const QvFolderEntry& a, const QvFolderEntry& b) { return a.name < b.name; });

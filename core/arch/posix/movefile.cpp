@@ -65,6 +65,9 @@ bool copyFile(const char* from, const char* to) {
     Descriptor target(open(to, O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0600));
     if (target.get() < 0) return false;
     if (!copyBytes(source.get(), target.get(), facts.st_size)) return false;
+    // A file that somebody still writes would lose what came after the look at its size.
+    struct stat after {};
+    if (fstat(source.get(), &after) != 0 || after.st_size != facts.st_size) return false;
     const timespec times[2] = {facts.st_atim, facts.st_mtim};
     (void)fchmod(target.get(), facts.st_mode & 07777);
     (void)futimens(target.get(), times);

@@ -65,6 +65,12 @@ TEST_P(FileUtil, LengthKeepsThePlaceInAStream) {
     EXPECT_EQ(QvFile::flength(static_cast<void*>(nullptr)), -1);
 }
 
+TEST_P(FileUtil, APipeHasNoLengthAndNobodyWaitsForIt) {
+    ASSERT_EQ(mkfifo(temp.file("pipe").c_str(), 0600), 0);
+    EXPECT_EQ(QvFile::flength(name("pipe")), -1);
+    EXPECT_TRUE(QvFile::isFile(name("pipe")));
+}
+
 TEST_P(FileUtil, FoldersAreMadeWithTheirParents) {
     EXPECT_EQ(QvFile::mkpath(name("a/b//c/")), 0);
     EXPECT_TRUE(QvFile::isDir(name("a/b/c")));
