@@ -1,0 +1,171 @@
+#include "core/decode/qvdecoderstate.h"
+
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <chrono>
+#include <filesystem>
+#include <fstream>
+#include <functional>
+#include <string>
+#include <vector>
+
+#include "core/engine/init.h"
+#include "core/engine/qvlog.h"
+#include "tests/support/temp_folder.h"
+
+namespace {
+
+namespace fs = std::filesystem;
+
+Any block(int bytes) {
+    std::string text(static_cast<std::size_t>(bytes), 0);
+    for (int i = 0; i < bytes; ++i) text[static_cast<std::size_t>(i)] = static_cast<char>(i * 13);
+    return Any(static_cast<const void*>(text.data()), bytes);
+}
+
+class DecoderState : public testing::Test {
+  protected:
+    DecoderState()
+        : file(folder.write("movie.mpg", "x").c_str()), manager("index", Any(folder.path().c_str())) {}
+
+    // The one folder that the manager made for `file`.
+    fs::path kept() const {
+        for (const auto& entry : fs::directory_iterator(folder.path() / "index")) return entry.path();
+        return {};
+    }
+    void rewriteDocument(const std::string& from, const std::string& to) {
+        const std::string name = (kept() / "state.xml").string();
+        std::string text = TempFolder::read(name);
+        const auto at = text.find(from);
+        ASSERT_NE(at, std::string::npos) << from;
+        std::ofstream(name, std::ios::binary) << text.replace(at, from.size(), to);
+    }
+
+    TempFolder folder;
+    Any file;
+    QvDecoderStateManager manager;
+};
+
+QvDecoderState sample() {
+    QvDecoderState state;
+    state.set("frames", Any(250));
+    state.set("length", Any(1LL << 40));
+    state.set("note", Any(std::string(500, 'n').c_str()));
+    state.set("small", block(128));
+    state.set("my_index", block(129));
+    state.set("rates", AnyVector(25.0, "x"));
+    return state;
+}
+
+TEST_F(DecoderState, EverythingComesBack) {
+    EXPECT_FALSE(manager.stateStored(file));
+    const QvDecoderState state = sample();
+    ASSERT_EQ(manager.storeState(file, state), 0);
+    EXPECT_TRUE(manager.stateStored(file));
+    EXPECT_EQ(kept().filename().string().size(), 32u);
+    EXPECT_TRUE(fs::exists(kept() / "my_index.dat"));
+    EXPECT_FALSE(fs::exists(kept() / "small.dat"));
+
+    QvDecoderStateManager later("index", Any(folder.path().c_str()));
+    QvDecoderState again;
+    again.set("stale", Any(1));
+    ASSERT_EQ(later.restoreState(file, again), 0);
+    EXPECT_TRUE(static_cast<const AnyDict&>(again) == state);
+    EXPECT_EQ(later.restoreState("/no/such/file", again), -1);
+}
+
+TEST_F(DecoderState, StoringAgainReplaces) {
+    ASSERT_EQ(manager.storeState(file, sample()), 0);
+    ASSERT_EQ(manager.storeState(file, QvDecoderState(AnyDict("only", 1))), 0);
+    EXPECT_FALSE(fs::exists(kept() / "my_index.dat"));
+    QvDecoderState again;
+    ASSERT_EQ(manager.restoreState(file, again), 0);
+    EXPECT_EQ(again.size(), 1);
+    EXPECT_EQ(manager.deleteState(file), 0);
+    EXPECT_FALSE(manager.stateStored(file));
+}
+
+TEST_F(DecoderState, AChangedFileVoidsItsState) {
+    ASSERT_EQ(manager.storeState(file, sample()), 0);
+    const fs::path path = file.asString();
+    fs::last_write_time(path, fs::last_write_time(path) + std::chrono::seconds(10));
+    EXPECT_FALSE(manager.stateStored(file));
+    EXPECT_TRUE(kept().empty()) << "and removes it";
+}
+
+TEST_F(DecoderState, DamageCountsAsNotStored) {
+    const struct {
+        const char* what;
+        std::function<void()> damage;
+    } cases[] = {
+        {"no document", [this] { fs::remove(kept() / "state.xml"); }},
+        {"no XML", [this] { folder.write("index/" + kept().filename().string() + "/state.xml", "<"); }},
+        {"another root",
+         [this] {
+             rewriteDocument("<decoderState", "<encoderState");
+             rewriteDocument("</decoderState", "</encoderState");
+         }},
+        {"no time", [this] { rewriteDocument("modified", "modifies"); }},
+        {"no block", [this] { fs::remove(kept() / "my_index.dat"); }},
+        {"a cut block", [this] { fs::resize_file(kept() / "my_index.dat", 30); }},
+        {"a name that leads out", [this] { rewriteDocument("BLOB_my_index", "BLOB_../my_index"); }},
+    };
+    for (const auto& c : cases) {
+        ASSERT_EQ(manager.storeState(file, sample()), 0) << c.what;
+        c.damage();
+        QvDecoderState state;
+        EXPECT_EQ(manager.restoreState(file, state), -1) << c.what;
+        EXPECT_TRUE(kept().empty()) << c.what;
+    }
+}
+
+TEST_F(DecoderState, NamesOfKeysNeverBecomePaths) {
+    QvDecoderState state;
+    state.set("../../out", block(500));
+    state.set("a_name_that_leaves_no_room_for_a_prefix", block(300));
+    ASSERT_EQ(manager.storeState(file, state), 0);
+    for (const auto& entry : fs::recursive_directory_iterator(folder.path()))
+        EXPECT_NE(entry.path().filename(), "out.dat");
+    QvDecoderState again;
+    ASSERT_EQ(manager.restoreState(file, again), 0);
+    EXPECT_EQ(again.size(), 1);
+    EXPECT_TRUE(again["a_name_that_leaves_no_room_for_a_prefix"] == block(300)) << "stays in the document";
+}
+
+TEST_F(DecoderState, WhatCanNotBeWrittenLeavesNothing) {
+    fs::remove_all(folder.path() / "index");
+    EXPECT_EQ(manager.storeState(file, sample()), -1);
+    EXPECT_FALSE(manager.stateStored(file));
+}
+
+TEST_F(DecoderState, ClearingTakesOnlyWhatItMade) {
+    ASSERT_EQ(manager.storeState(file, sample()), 0);
+    const fs::path root = folder.path() / "index";
+    for (const char* name : {"cache", "0123456789ABCDEF0123456789ABCDEF", "0123456789abcdef0123456789abcde"})
+        fs::create_directory(root / name);
+    fs::create_directory(root / "fedcba9876543210fedcba9876543210");
+    folder.write("index/0123456789abcdef0123456789abcdef", "a file");
+    manager.clearStates();
+    std::vector<std::string> left;
+    for (const auto& entry : fs::directory_iterator(root)) left.push_back(entry.path().filename().string());
+    std::sort(left.begin(), left.end());
+    EXPECT_EQ(left,
+              (std::vector<std::string>{"0123456789ABCDEF0123456789ABCDEF", "0123456789abcdef0123456789abcde",
+                                        "0123456789abcdef0123456789abcdef", "cache"}));
+}
+
+TEST_F(DecoderState, WithoutAFolderNothingIsKept) {
+    folder.write("plain", "");
+    qv_log()->clear();
+    QvDecoderStateManager none("index", Any(folder.file("plain").c_str()));
+    EXPECT_TRUE(none.disabled());
+    EXPECT_EQ(qv_log()->nrErrors(), 1);
+    QvDecoderState state;
+    EXPECT_EQ(none.storeState(file, sample()), -1);
+    EXPECT_EQ(none.restoreState(file, state), -1);
+    EXPECT_FALSE(none.stateStored(file));
+    none.clearStates();
+}
+
+}  // namespace
