@@ -40,7 +40,7 @@ int QvVf::open() {
     if (getState() == stateOpen) return QvStatus::ok;
     for (const auto& filter : filters_) {
         if (const int result = filter->open()) {
-            qv_dbg()->error("[video pipe] open error");
+            qv_dbg()->write("[video pipe] open error");
             return setError(result, "%s: %s", filter->name(), filter->errorDesc());
         }
     }

@@ -64,7 +64,9 @@ class FakeDecoder : public QvDecodePipe {
     int readFrame(int) override {
         if (next == failAt) return setError(-1, "the disc is gone");
         if (next >= available()) return QvStatus::endOfStream;
-        if (!frame.inited()) frame.init(QvFourcc::GRAY, video.getInt32("width"), video.getInt32("height"));
+        if (!frame.inited())
+            frame.init(static_cast<unsigned>(video.getInt32("FOURCC")), video.getInt32("width"),
+                       video.getInt32("height"));
         frame.framerate = video.get("framerate").asFramerate();
         frame.frameNr = next++;
         ++read;

@@ -5,10 +5,12 @@
 #include "builtin/modules.h"
 #include "core/engine/qvexception.h"
 #include "core/filter/qvprocesspipe.h"
+#include "core/stream/qvbuffifo.h"
 #include "core/transcode/translink.h"
 #include "tests/support/fake_filters.h"
 #include "tests/support/fake_streams.h"
 #include "tests/support/log_capture.h"
+#include "tests/support/temp_folder.h"
 
 namespace {
 
@@ -333,6 +335,79 @@ TEST(TransVLink, QualityLogNeedsAnEncoderThatGivesIt) {
     ASSERT_EQ(job.open(&params), 0);
     EXPECT_TRUE(log.contains("Can not start logging.", QvLogMask::error));
     EXPECT_EQ(job.encoder.video.params.getInt32("getQualityStats", -1), 0);
+}
+
+// One video stream, for what the link asks of a multiplexer.
+class OneStreamMuxer : public QvMuxer {
+  public:
+    explicit OneStreamMuxer(QvBufStream* video = nullptr) : video_(video) {}
+    QvBufStream* addStream(int, const AnyDict&) override { return nullptr; }
+    void removeStreams(int) override {}
+    void removeStream(int, int) override {}
+    int nrStreams(int type) const override { return type == 1 && video_ ? 1 : 0; }
+    QvBufStream* stream(int, int) const override { return video_; }
+    void getParam(const char* name, Any& value) const override {
+        if (params.isSet(name)) value = params.get(name);
+    }
+    int open() override { return 0; }
+    int close() override { return 0; }
+    AnyDict params;
+
+  private:
+    QvBufStream* video_;
+};
+
+TEST(TransVLink, WritesWhatTheEncoderTellsOfItsFrames) {
+    TempFolder folder;
+    QvBufStreamFifo stream;
+    const AnyDict size("size", 4096, "chunk", 1024);
+    ASSERT_EQ(stream.init(size), 0);
+    OneStreamMuxer muxer(&stream);
+    Job job(3, QvFramerate::f25p(), QvFramerate::f25p());
+    job.encoder.muxer = &muxer;
+    QvEncodingQualityStatsSetup setup;
+    setup.addLog(Any(folder.file("q.txt").c_str()));
+    const AnyDict params("qualityStats", static_cast<const AnyVector&>(setup));
+    ASSERT_EQ(job.open(&params), 0);
+    const auto tell = [&](std::vector<double> values, unsigned bytes) {
+        auto* bs = stream.input();
+        bs->auxinfo(bs, 0, QvAuxId::STATISTIC_INFO, values.data(),
+                    static_cast<unsigned>(values.size() * sizeof(double)));
+        bs->auxinfo(bs, 0, QvAuxId::VIDEO_AU_CODE, &bytes, sizeof bytes);
+    };
+    tell({40.5, 41.0, 42.25}, 1000);
+    tell({}, 20);
+    job.link.close();
+    EXPECT_EQ(TempFolder::read(folder.file("q.txt")), "0\t1000\t40.5000\t41.0000\t42.2500\n1\t20\n");
+    EXPECT_EQ(job.encoder.video.params.getInt32("getQualityStats", -1), 0);
+    tell({1.0}, 5);  // nobody listens any more
+}
+
+TEST(TransVLink, TheFirstFrameBecomesTheIcon) {
+    TempFolder folder;
+    FakePlugin plugin;
+    plugin.video("scaler").add(new QvVfModule);
+    OneStreamMuxer muxer;
+    muxer.params.set("needBMP", 1);
+    muxer.params.set("filename", Any(folder.file("clip.mov").c_str()));
+    Job job(3, QvFramerate::f25p(), QvFramerate::f25p());
+    job.decoder.video.set("FOURCC", static_cast<int>(QvFourcc::BGR3));
+    job.encoder.video.params.set("inFOURCC", AnyVector(Any(static_cast<int>(QvFourcc::BGR3))));
+    job.encoder.muxer = &muxer;
+    ASSERT_EQ(job.open(), 0);
+    EXPECT_EQ(job.run(), 0);
+    EXPECT_EQ(TempFolder::read(folder.file("clip.BMP")).substr(0, 2), "BM");
+}
+
+TEST(TransVLink, RepeatsAFrameOfThePipe) {
+    FakePlugin plugin;
+    plugin.video("scaler").add(new QvVfModule);
+    Job job(3, QvFramerate::f25p(), QvFramerate::f25p());
+    job.encoder.video.params.set("width", 32);
+    job.encoder.video.params.set("_needEven", 1);
+    ASSERT_EQ(job.open(), 0);
+    EXPECT_EQ(job.run(), 0);
+    EXPECT_EQ(job.encoder.video.numbers, (std::vector<int>{0, 1, 2, 2}));
 }
 
 TEST(TransVLink, TakesOnlyTheParametersThatAreThere) {
