@@ -1,0 +1,108 @@
+#include "core/encode/qvencodepipe.h"
+
+#include <gtest/gtest.h>
+
+#include <memory>
+
+#include "core/engine/qvexception.h"
+#include "core/filter/filtersstate.h"
+#include "core/media/qvgeometry.h"
+#include "tests/support/failing_codecs.h"
+#include "tests/support/log_capture.h"
+
+namespace {
+
+class Pipe : public testing::Test {
+  protected:
+    void limits(int videos, int audios, int subpics, int total) {
+        outputs_.params.set("rawmux.maxStreams",
+                            AnyDict("vids", videos, "auds", audios, "subs", subpics, "total", total));
+    }
+
+    FailingOutputs outputs_;
+    std::unique_ptr<QvEncodePipe> pipe_{QvEncodePipe::create()};
+};
+
+// The pipe has one stream of each kind.
+TEST_F(Pipe, RoomForStreams) {
+    struct Row {
+        int videos, audios, subpics, total;
+        int forVideo, forAudio, forSubpic, forAny;
+    };
+    for (const auto& row : {Row{0, 1, 0, 9, -1, 0, -1, 7}, Row{2, 4, 1, 9, 1, 3, 1, 7},
+                            Row{9, 9, 0, 2, 0, 0, -1, 0}, Row{1, 1, 9, 2, 0, 0, 0, 0}}) {
+        SCOPED_TRACE(testing::Message()
+                     << row.videos << " " << row.audios << " " << row.subpics << " " << row.total);
+        limits(row.videos, row.audios, row.subpics, row.total);
+        EXPECT_EQ(pipe_->canAddStreams(qvVideoStream), row.forVideo);
+        EXPECT_EQ(pipe_->canAddStreams(qvAudioStream), row.forAudio);
+        EXPECT_EQ(pipe_->canAddStreams(qvSubpicStream), row.forSubpic);
+        EXPECT_EQ(pipe_->canAddStreams(0), row.forAny);
+        EXPECT_EQ(pipe_->maxStreams(qvSubpicStream), row.subpics);
+        EXPECT_EQ(pipe_->maxStreams(0), row.total);
+        QvAVS3plet<int> all;
+        EXPECT_EQ(pipe_->maxStreams(&all), row.total);
+        EXPECT_EQ(all.video * 100 + all.audio * 10 + all.subpic,
+                  row.videos * 100 + row.audios * 10 + row.subpics);
+    }
+    EXPECT_THROW(pipe_->maxStreams(3), QvAssertFailure);
+    EXPECT_THROW(pipe_->canAddStreams(5), QvAssertFailure);
+    outputs_.params.set("rawmux.maxStreams", "many");
+    LogCapture log;
+    EXPECT_THROW(pipe_->maxStreams(1), QvAssertFailure);
+    EXPECT_TRUE(
+        log.contains("EncodePipe.maxStreams: muxer 'rawmux' does not implement 'maxStreams' parameter"));
+    EXPECT_THROW(pipe_->canAddStreams(1), QvAssertFailure);
+    EXPECT_TRUE(
+        log.contains("EncodePipe.canAddStreams: muxer 'rawmux' returned invalid value for 'maxStreams'"));
+}
+
+TEST_F(Pipe, WhatIsNotThereIsNull) {
+    EXPECT_EQ(pipe_->programSetup(), nullptr);
+    EXPECT_FALSE(pipe_->programsSupported());
+    EXPECT_EQ(pipe_->outputQueue(), nullptr);
+    for (const auto& [type, nr] : {std::pair(1, 1), {1, -1}, {2, 7}, {4, 0}, {3, 0}}) {
+        EXPECT_EQ(pipe_->stream(type, nr), nullptr);
+        EXPECT_EQ(pipe_->encoder(type, nr), nullptr);
+    }
+    EXPECT_EQ(pipe_->encoder(2), nullptr);
+    EXPECT_THROW(pipe_->streamAt(2), QvAssertFailure);
+    EXPECT_THROW(pipe_->writeFrame(nullptr, 1), QvAssertFailure);
+    EXPECT_THROW(pipe_->writePcm(nullptr, -1), QvAssertFailure);
+    QvOStream stranger(qvVideoStream);
+    EXPECT_EQ(pipe_->indexOf(&stranger), -1);
+    EXPECT_EQ(pipe_->streamNr(&stranger), -1);
+    EXPECT_FALSE(stranger.enabled());
+}
+
+TEST_F(Pipe, DescribesItsStreams) {
+    pipe_->setParam("video0", AnyDict("width", 1280, "height", 720, "framerate", QvFramerate(25.0)));
+    AnyVector desc;
+    pipe_->getStreamDesc(qvVideoStream, 0, desc);
+    ASSERT_EQ(desc.size(), 3);
+    EXPECT_EQ(desc[0], "1280x720");
+    struct Row {
+        int channels;
+        const char* text;
+    };
+    for (const auto& row : {Row{1, "mono"}, Row{2, "stereo"}, Row{6, "multi ch."}}) {
+        pipe_->setParam("audio0", AnyDict("channels", row.channels, "samplerate", 44100));
+        pipe_->getStreamDesc(qvAudioStream, 0, desc);
+        ASSERT_EQ(desc.size(), 3);
+        EXPECT_EQ(desc[0], "44100Hz");
+        EXPECT_EQ(desc[1], row.text);
+    }
+    pipe_->getStreamDesc(qvAudioStream, 1, desc);
+    EXPECT_TRUE(desc.empty());
+}
+
+TEST_F(Pipe, KeepsTheFiltersOfEachStream) {
+    FiltersState filters;
+    filters.setFilter("cropper", AnyDict("name", "cropper", "_on", 1));
+    pipe_->setFilters(qvAudioStream, 0, filters);
+    EXPECT_EQ(pipe_->filters(qvAudioStream, 0), filters);
+    EXPECT_TRUE(pipe_->filters(qvVideoStream, 0).empty());
+    EXPECT_THROW(pipe_->filters(qvVideoStream, 1), QvAssertFailure);
+}
+
+}  // namespace
