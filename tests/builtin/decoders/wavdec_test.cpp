@@ -187,7 +187,7 @@ TEST_F(Wav, TruncationAtEveryByteIsToldOrRefused) {
 TEST_F(Wav, SizesThatWereNeverWrittenMeanToTheEnd) {
     const std::string format = wavChunk("fmt ", wavFormat(1, 2, 48000, 16));
     const std::string data = patternBytes(4 * 500);
-    for (const std::uint64_t size : {0ull, 0xFFFFFFFFull, 0x7FFFF000ull}) {
+    for (const std::uint64_t size : {0ull, 0xFFFFFFFFull, 0x7FFFF000ull, 0x7FFFFFFCull}) {
         const std::string file =
             "RIFF" + leBytes(size, 4) + "WAVE" + format + "data" + leBytes(size, 4) + data;
         ASSERT_EQ(open(file), 0);
