@@ -214,6 +214,37 @@ TEST_F(Raw, ChangesWhileOpenStartOver) {
     EXPECT_EQ(decoder.getState(), 2);
 }
 
+// Cb, Y, Cr of 10 bits each in a word, all 512 but the luma of the second frame.
+TEST_F(Raw, V210IsDeliveredAsY216OrRefused) {
+    const auto frameOf = [](unsigned luma) {
+        std::string bytes;
+        for (int group = 0; group < 8 * 2; ++group)
+            bytes += leBytes(512 | luma << 10 | 512 << 20, 4) + leBytes(luma | 512 << 10 | luma << 20, 4) +
+                     leBytes(512 | luma << 10 | 512 << 20, 4) + leBytes(luma | 512 << 10 | luma << 20, 4);
+        return bytes;
+    };
+    set("v210", 48, 2);
+    const std::string bytes = frameOf(512) + frameOf(128) + "rest";
+    const std::unique_ptr<QvCodec> converter(qv_registry()->newCodec("colorconv"));
+    if (!converter) {
+        EXPECT_EQ(open(bytes), -1);
+        EXPECT_STREQ(decoder.errorDesc(), "media dec: no converter for v210");
+        return;
+    }
+    ASSERT_EQ(open(bytes), 0);
+    EXPECT_EQ(decoder.nrFrames(0), 2);
+    EXPECT_EQ(static_cast<unsigned>(decoder.getVideoParam(0, "FOURCC").toInt32()), QvFourcc::Y216);
+    for (const int luma : {512, 128}) {
+        ASSERT_EQ(decoder.readFrame(0), 0);
+        const QvFrame& frame = *decoder.getFramePtr(0);
+        ASSERT_EQ(frame.four_cc(), QvFourcc::Y216);
+        const unsigned char* first = frame.plane();
+        EXPECT_NEAR(first[0] | first[1] << 8, luma << 6, 64);
+        EXPECT_NEAR(first[2] | first[3] << 8, 512 << 6, 64);
+        EXPECT_EQ(frame.frameNr, luma == 512 ? 0 : 1);
+    }
+}
+
 TEST_F(Raw, SettingsComeBackFromAStoredState) {
     std::unique_ptr<QvCodec> first(qv_registry()->newCodec("rawdec"));
     for (const auto& [name, value] : {std::pair<const char*, Any>{"FOURCC", Any("YUY2")},
