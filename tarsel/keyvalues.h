@@ -1,0 +1,21 @@
+// "key=value,key=value" as in "testgen:size=1280x720,rate=25" and "scaler:kind=2".
+#pragma once
+
+#include <string>
+#include <string_view>
+#include <utility>
+#include <vector>
+
+class KeyValues {
+  public:
+    // Throws Failure (usage), with `option` in the line, for a pair without "=" or a key that is not among
+    // `known` (any key when that is empty).
+    KeyValues(std::string_view text, const std::vector<std::string>& known, std::string_view option);
+
+    // The value of a key, or null. The last of equal keys counts.
+    const std::string* find(std::string_view key) const;
+    const std::vector<std::pair<std::string, std::string>>& all() const { return pairs_; }
+
+  private:
+    std::vector<std::pair<std::string, std::string>> pairs_;
+};

@@ -1,0 +1,40 @@
+// What a person or a program sees while a job runs: one line on a terminal, JSON lines, or nothing.
+#pragma once
+
+#include <chrono>
+#include <string>
+
+struct ProgressState {
+    double part = -1;         // 0 to 1; negative when unknown
+    long long frame = 0;      // frames of the output written so far
+    double outSeconds = 0;    // their time in the output
+    int pass = 1, passes = 1;
+    const char* state = "running";
+};
+
+enum class ProgressMode { automatic, json, off };
+
+class Progress {
+  public:
+    // Automatic: a line when the standard error is a terminal, otherwise nothing. `label` stands in front.
+    Progress(ProgressMode mode, std::string label);
+    ~Progress();
+
+    void start();
+    // Cheap: shows something only when the last time is long enough ago.
+    void update(const ProgressState& state);
+    bool due() const;
+    // Sends the last event; the line goes.
+    void finish(const ProgressState& state);
+    bool onTerminal() const { return line_; }
+
+  private:
+    using Clock = std::chrono::steady_clock;
+    void show(const char* event, const ProgressState& state);
+    void showLine(const ProgressState& state, double elapsed, double eta);
+    void showJson(const char* event, const ProgressState& state, double elapsed, double eta);
+
+    std::string label_;
+    bool line_ = false, json_ = false, shown_ = false, color_ = false;
+    Clock::time_point begin_ = Clock::now(), last_{};
+};

@@ -1,0 +1,62 @@
+#include "signals.h"
+
+#include <atomic>
+#include <mutex>
+
+#include <pthread.h>
+#include <signal.h>
+#include <unistd.h>
+
+namespace {
+
+std::atomic<int> g_received{0};
+std::mutex g_lock;
+std::function<void()> g_first, g_second;
+
+sigset_t stopSignals() {
+    sigset_t set;
+    sigemptyset(&set);
+    sigaddset(&set, SIGINT);
+    sigaddset(&set, SIGTERM);
+    return set;
+}
+
+Exit statusOf(int signal) { return signal == SIGTERM ? Exit::terminated : Exit::interrupted; }
+
+// Runs for the life of the process, so it is detached: a signal may come until the very end.
+void waitForSignals() {
+    const sigset_t set = stopSignals();
+    for (int signal = 0; sigwait(&set, &signal) == 0;) {
+        const int earlier = g_received.exchange(signal);
+        std::lock_guard guard(g_lock);
+        if (earlier != 0 || !g_first) {
+            if (g_second) g_second();
+            _exit(static_cast<int>(statusOf(signal)));
+        }
+        g_first();
+    }
+}
+
+}  // namespace
+
+Signals::Signals() {
+    const sigset_t set = stopSignals();
+    pthread_sigmask(SIG_BLOCK, &set, nullptr);
+    signal(SIGPIPE, SIG_IGN);  // a closed pipe is an error of the write
+    std::thread(waitForSignals).detach();
+}
+
+Signals::~Signals() { unwatch(); }
+
+void Signals::watch(std::function<void()> first, std::function<void()> second) {
+    std::lock_guard guard(g_lock);
+    g_first = std::move(first);
+    g_second = std::move(second);
+}
+
+void Signals::unwatch() { watch(nullptr, nullptr); }
+
+Exit Signals::received() const {
+    const int signal = g_received.load();
+    return signal == 0 ? Exit::done : statusOf(signal);
+}

@@ -1,0 +1,217 @@
+#include "source.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <cstring>
+#include <filesystem>
+
+#include "failure.h"
+#include "keyvalues.h"
+#include "timespec.h"
+
+namespace {
+
+constexpr int kDecoder = 2;
+constexpr const char* kGenerator = "testgen:";
+
+// Collects what the factory says while it tries decoders.
+struct OpenLog : QvFileOpenCb {
+    int fileOpenFinished(int result, QvFileOpenCbData& data) override {
+        if (result != 0 && data.text.isString()) lastFailure = data.text.asString();
+        return 0;
+    }
+    std::string lastFailure;
+};
+
+std::vector<std::string> moduleNames(int kind) {
+    std::vector<std::string> names;
+    const AnyVector modules = qv_registry()->modules(kind);
+    for (int i = 0; i < modules.size(); ++i) names.push_back(modules.at(i).asDict().getString("name", ""));
+    return names;
+}
+
+// Every name that a raw format takes.
+const std::vector<std::string> kRawKeys = {"size",       "pixel",  "rate",   "offset",
+                                           "interlaced", "invert", "aspect", "fields"};
+const std::vector<std::string> kGeneratorKeys = {"size", "rate",  "duration", "views",
+                                                 "mode", "audio", "aspect",   "picture"};
+
+double parseAspect(const std::string& text, const std::string& option) {
+    const size_t colon = text.find(':');
+    if (colon == std::string::npos) return static_cast<double>(parseNumber(text, 1, 100, option));
+    return static_cast<double>(parseNumber(text.substr(0, colon), 1, 10000, option)) /
+           static_cast<double>(parseNumber(text.substr(colon + 1), 1, 10000, option));
+}
+
+}  // namespace
+
+std::unique_ptr<QvCodec> makeAnyCodec(const std::string& module, int kind) {
+    const QvModule* found = qv_registry()->module(module.c_str());
+    if (!found || found->getAttr("type").toInt32() != kind)
+        throw Failure(Exit::module, "there is no module " + quoted(module) + " of this kind." +
+                                        suggestion(module, moduleNames(kind)) + " 'tarsel modules' lists all");
+    std::unique_ptr<QvCodec> codec(qv_registry()->newCodec(module.c_str()));
+    if (!codec)
+        throw Failure(Exit::module, "the module " + quoted(module) + " can't be used in this installation");
+    return codec;
+}
+
+void setChecked(QvCodec& codec, const std::string& name, const Any& value, const std::string& what) {
+    int result = QvStatus::invalidParam;
+    try {
+        result = codec.setParam(name.c_str(), value);
+    } catch (const QvParamException&) {
+        throw Failure(Exit::usage, what + ": " + codec.name() + " has no parameter " + quoted(name));
+    }
+    if (result == QvStatus::ok) return;
+    throw Failure(Exit::usage, what + ": " + codec.name() + " can't take this value for " + quoted(name));
+}
+
+Source::Source(const std::string& spec, const std::string& raw) : name_(spec) {
+    if (spec.rfind(kGenerator, 0) == 0 || spec == "testgen") {
+        isFile_ = false;
+        if (!raw.empty()) throw Failure(Exit::usage, "--raw describes a file; " + quoted(spec) + " is none");
+        openGenerator(spec);
+        return;
+    }
+    std::error_code error;
+    const auto status = std::filesystem::status(spec, error);
+    if (!std::filesystem::exists(status)) refuse("no such file");
+    if (std::filesystem::is_directory(status)) refuse("this is a folder");
+    if (std::filesystem::is_regular_file(status)) {
+        if (std::filesystem::file_size(spec, error) == 0 && !error) refuse("the file is empty");
+        if (FILE* file = std::fopen(spec.c_str(), "rb"))
+            std::fclose(file);
+        else
+            refuse(std::strerror(errno));
+    } else {
+        refuse("this is no regular file");
+    }
+    if (raw.empty())
+        openFile();
+    else
+        openRaw(raw);
+}
+
+void Source::refuse(const std::string& why) const {
+    throw Failure(Exit::input, "can't open " + quoted(name_) + ": " + why);
+}
+
+void Source::openGenerator(const std::string& spec) {
+    const std::string option = "testgen";
+    const size_t colon = spec.find(':');
+    const KeyValues keys(colon == std::string::npos ? "" : std::string_view(spec).substr(colon + 1),
+                         kGeneratorKeys, option);
+    const auto value = [&](const char* key, const char* otherwise) {
+        const std::string* given = keys.find(key);
+        return given ? *given : std::string(otherwise);
+    };
+    const Size size = parseSize(value("size", "1280x720"), option + ": size");
+    if (size.width < 32 || size.height < 32)
+        throw Failure(Exit::usage, option + ": size: the test picture is at least 32x32");
+    const QvFramerate rate = parseRate(value("rate", "25"), option + ": rate");
+    const MediaTime duration = parseTime(value("duration", "10"), rate, option + ": duration");
+
+    AnyDict video, audio, streams;
+    video.set("width", size.width);
+    video.set("height", size.height);
+    video.set("framerate", Any(rate));
+    video.set("duration", Any(duration));
+    if (const std::string* views = keys.find("views"))
+        video.set("nrViews", static_cast<int>(parseNumber(*views, 1, 10, option + ": views")));
+    if (const std::string* aspect = keys.find("aspect"))
+        video.set("frameAspect", parseAspect(*aspect, option + ": aspect"));
+    if (const std::string* picture = keys.find("picture")) {
+        if (!std::filesystem::is_regular_file(*picture))
+            throw Failure(Exit::input, "can't open the picture " + quoted(*picture));
+        video.set("picture", picture->c_str());
+    }
+    audio.set("duration", Any(duration));
+    AnyVector vids, auds;
+    vids.append(video);
+    if (parseNumber(value("audio", "1"), 0, 1, option + ": audio")) auds.append(audio);
+    streams.set("vids", vids);
+    streams.set("auds", auds);
+
+    decoder_ = makeCodec<QvDecodePipe>("testgen", kDecoder);
+    if (const std::string* mode = keys.find("mode")) {
+        if (*mode != "graybar" && *mode != "card")
+            throw Failure(Exit::usage, option + ": mode: use card or graybar");
+        decoder_->setParam("mode", mode->c_str());
+    }
+    decoder_->setParam("streams", streams);
+    if (decoder_->open() != QvStatus::ok) refuse(decoder_->errorDesc());
+    if (decoder_->nrStreams(1) == 0) refuse("the picture can't be used");
+}
+
+void Source::openRaw(const std::string& raw) {
+    const std::string option = "--raw";
+    const KeyValues keys(raw, kRawKeys, option);
+    const std::string *size = keys.find("size"), *pixel = keys.find("pixel"), *rate = keys.find("rate");
+    if (!size || !pixel) throw Failure(Exit::usage, "--raw needs size=WIDTHxHEIGHT and pixel=FORMAT");
+    decoder_ = makeCodec<QvDecodePipe>("rawdec", kDecoder);
+    QvDecodePipe& d = *decoder_;
+    const Size dimensions = parseSize(*size, option + " size");
+    setChecked(d, "filename", name_.c_str(), option);
+    setChecked(d, "FOURCC", static_cast<int>(parseFourcc(*pixel, option + " pixel")), option + " pixel");
+    setChecked(d, "width", dimensions.width, option + " size");
+    setChecked(d, "height", dimensions.height, option + " size");
+    setChecked(d, "framerate", Any(parseRate(rate ? *rate : "25", option + " rate")), option + " rate");
+    if (const auto* offset = keys.find("offset"))
+        setChecked(d, "offset", parseNumber(*offset, 0, 1LL << 62, option + " offset"), option + " offset");
+    if (const auto* order = keys.find("interlaced"))
+        setChecked(d, "interlacedFlag", static_cast<int>(parseNumber(*order, 0, 2, option + " interlaced")),
+                   option + " interlaced");
+    if (const auto* invert = keys.find("invert"))
+        setChecked(d, "invert", static_cast<int>(parseNumber(*invert, 0, 1, option + " invert")),
+                   option + " invert");
+    if (const auto* fields = keys.find("fields"))
+        setChecked(d, "fieldOrderFile", static_cast<int>(parseNumber(*fields, 0, 1, option + " fields")),
+                   option + " fields");
+    if (const auto* aspect = keys.find("aspect"))
+        setChecked(d, "frameAspect", parseAspect(*aspect, option + " aspect"), option + " aspect");
+    if (d.open() != QvStatus::ok) refuse(d.errorDesc());
+    if (d.nrFrames(0) == 0) refuse("the file is shorter than one frame of " + *size + " " + *pixel);
+}
+
+void Source::openFile() {
+    const Any ext = QvFile::getExt(Any(name_.c_str()), true);
+    OpenLog log;
+    decoder_.reset(QvDecFactory::decodePipe(Any(name_.c_str()), Any(), &log, nullptr));
+    if (decoder_) return;
+    const AnyVector candidates = qv_registry()->decoders(ext.asString());
+    const std::unique_ptr<AnyVector> exts(qv_registry()->inputExts(false, false));
+    if (candidates.empty()) {
+        std::vector<std::string> known;
+        for (int i = 0; i < exts->size(); ++i) known.push_back(exts->at(i).asString());
+        if (std::find(known.begin(), known.end(), ext.asString()) != known.end())
+            refuse("a raw file has no header; give its format with --raw size=WxH,pixel=FORMAT,rate=R");
+        refuse("no decoder for the extension " + quoted(ext.asString()) + "; 'tarsel formats' lists what opens");
+    }
+    refuse(log.lastFailure.empty() ? "no decoder can read it" : log.lastFailure);
+}
+
+std::optional<QvFramerate> Source::frameRate() const {
+    if (decoder_->nrStreams(1) == 0) return std::nullopt;
+    const Any rate = decoder_->getVideoParam(0, "framerate");
+    if (!rate.isFramerate()) return std::nullopt;
+    return rate.asFramerate();
+}
+
+double Source::duration() const {
+    double longest = -1;
+    for (int type : {1, 2})
+        for (int i = 0; i < decoder_->nrStreams(type); ++i) {
+            const Any seconds = decoder_->getStreamParam(type, i, "duration");
+            if (seconds.isDouble()) longest = std::max(longest, seconds.asDouble());
+        }
+    return longest;
+}
+
+void Source::selectAll() {
+    for (int type : {1, 2})
+        for (int i = 0; i < decoder_->nrStreams(type); ++i)
+            if (decoder_->select(type, i) != QvStatus::ok)
+                refuse(std::string(type == 1 ? "video" : "audio") + " stream " + std::to_string(i) +
+                       " can't be read");
+}

@@ -1,0 +1,54 @@
+// An input of the tool: a file, a raw file with its format given, or the built-in generator.
+#pragma once
+
+#include <memory>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include <qvplugcore/qvplugcore.h>
+
+class Source {
+  public:
+    // `spec`: a file name, or "testgen:size=1280x720,rate=25,duration=10". `raw`: the format of a raw file
+    // ("size=352x288,pixel=I420,rate=25"), empty to open by extension. Throws Failure.
+    Source(const std::string& spec, const std::string& raw);
+
+    QvDecodePipe& decoder() const { return *decoder_; }
+    const std::string& name() const { return name_; }
+    bool isFile() const { return isFile_; }
+
+    // Of the first video stream.
+    std::optional<QvFramerate> frameRate() const;
+    // Seconds of the longest stream; negative when unknown.
+    double duration() const;
+    // Why the file holds less than its header says, or more than whole frames; empty when it is whole.
+    std::string damage() const;
+
+    // Selects every video and audio stream.
+    void selectAll();
+
+  private:
+    void openGenerator(const std::string& spec);
+    void openRaw(const std::string& raw);
+    void openFile();
+    [[noreturn]] void refuse(const std::string& why) const;
+
+    std::string name_;
+    bool isFile_ = true;
+    std::unique_ptr<QvDecodePipe> decoder_;
+};
+
+// Sets a parameter that the decoder, encoder or filter must know; throws Failure (usage) for an unknown name
+// or a value it can't take.
+void setChecked(QvCodec& codec, const std::string& name, const Any& value, const std::string& what);
+
+// A new codec of a module, which must exist and be of a kind. Throws Failure (module).
+template <class T>
+std::unique_ptr<T> makeCodec(const std::string& module, int kind);
+std::unique_ptr<QvCodec> makeAnyCodec(const std::string& module, int kind);
+
+template <class T>
+std::unique_ptr<T> makeCodec(const std::string& module, int kind) {
+    return std::unique_ptr<T>(static_cast<T*>(makeAnyCodec(module, kind).release()->getInterface(kind)));
+}
