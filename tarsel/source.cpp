@@ -215,3 +215,21 @@ void Source::selectAll() {
                 refuse(std::string(type == 1 ? "video" : "audio") + " stream " + std::to_string(i) +
                        " can't be read");
 }
+
+std::string Source::damage() const {
+    for (int type : {1, 2})
+        for (int i = 0; i < decoder_->nrStreams(type); ++i) {
+            AnyDict params;
+            decoder_->getStreamParams(type, i, params);
+            if (!params.get("truncated").isTrue()) continue;
+            const bool video = type == 1;
+            const long long present = video ? decoder_->nrFrames(i) : decoder_->nrSamples(i);
+            const long long expected = params.getInt64(video ? "framesExpected" : "samplesExpected", present);
+            if (video && !params.isSet("samplesExpected") && expected == present + 1)
+                return "it ends in the middle of frame " + std::to_string(expected) + ", after " +
+                       std::to_string(present) + " whole ones";
+            return "it ends after " + std::to_string(present) + " of " + std::to_string(expected) +
+                   (video ? " frames" : " samples");
+        }
+    return "";
+}

@@ -1,0 +1,270 @@
+#include "job.h"
+
+#include <algorithm>
+#include <cstdio>
+#include <filesystem>
+
+#include "keyvalues.h"
+#include "timespec.h"
+
+namespace fs = std::filesystem;
+
+namespace {
+
+constexpr long long kTicks = 35280000;
+constexpr int kVideo = 1, kAudio = 2;
+constexpr int kVideoFilter = 12, kAudioFilter = 13;
+
+struct KindRow {
+    const char* extension;
+    OutputKind kind;
+};
+
+constexpr KindRow kKinds[] = {
+    {"wav", OutputKind::wav},  {"png", OutputKind::pictures}, {"avi", OutputKind::avi},
+    {"raw", OutputKind::raw},  {"yuv", OutputKind::raw},      {"rgb", OutputKind::raw},
+    {"i420", OutputKind::raw}, {"yv12", OutputKind::raw},     {"yuy2", OutputKind::raw},
+    {"yuyv", OutputKind::raw}, {"uyvy", OutputKind::raw},     {"bgr3", OutputKind::raw},
+    {"bgr4", OutputKind::raw}, {"bgra", OutputKind::raw},     {"argb", OutputKind::raw},
+    {"v210", OutputKind::raw},
+};
+
+// A value of --filter as the type that it looks like.
+Any valueOf(const std::string& text) {
+    char* end = nullptr;
+    const long long whole = std::strtoll(text.c_str(), &end, 10);
+    if (!text.empty() && *end == '\0' && whole >= INT32_MIN && whole <= INT32_MAX)
+        return Any(static_cast<int>(whole));
+    double number = 0;
+    const auto [rest, error] = std::from_chars(text.data(), text.data() + text.size(), number);
+    if (error == std::errc() && rest == text.data() + text.size()) return Any(number);
+    return Any(text.c_str());
+}
+
+int intParam(const QvDecodePipe& decoder, int type, int stream, const char* name) {
+    const Any value = decoder.getStreamParam(type, stream, name);
+    return value.isInt32() ? value.asInt32() : 0;
+}
+
+}  // namespace
+
+long long JobStream::bytes() const {
+    if (type == kAudio) return expected * channels * ((bits + 7) / 8);
+    QvFrame frame;
+    if (frame.init(fourcc, width, height) != QvStatus::ok) return 0;
+    return expected * frame.total_bytes();
+}
+
+Job::Job(const JobOptions& options, Signals& signals) : options_(options), signals_(signals) {
+    chooseOutput();
+    openInputs();
+    planStreams();
+    planPoints();
+    planLengths();
+    buildPipe();
+}
+
+Job::~Job() = default;
+
+bool Job::hasVideo() const {
+    return std::any_of(streams_.begin(), streams_.end(), [](const auto& s) { return s.type == kVideo; });
+}
+
+void Job::chooseOutput() {
+    if (options_.muxer == "nullmux") {
+        kind_ = OutputKind::nothing;
+        return;
+    }
+    if (options_.output.empty()) throw Failure(Exit::usage, "no output; give one with -o FILE");
+    const std::string extension = QvFile::getExt(Any(options_.output.c_str()), true).asString();
+    const auto* row = std::find_if(std::begin(kKinds), std::end(kKinds),
+                                   [&](const KindRow& r) { return extension == r.extension; });
+    std::error_code error;
+    const auto status = fs::status(options_.output, error);
+    const bool device = fs::exists(status) && !fs::is_regular_file(status) && !fs::is_directory(status);
+    if (row == std::end(kKinds) && !device) {
+        std::vector<std::string> known;
+        for (const auto& r : kKinds) known.push_back(r.extension);
+        throw Failure(Exit::usage, "-o " + quoted(options_.output) + ": no output has the extension " +
+                                       quoted(extension) + "." + suggestion(extension, known) +
+                                       " 'tarsel formats' lists all");
+    }
+    kind_ = row == std::end(kKinds) ? OutputKind::raw : row->kind;
+    outputs_ = std::make_unique<Outputs>(options_.output, options_.inputs, options_.overwrite);
+    if (kind_ == OutputKind::pictures) outputs_->checkNumbered("png");
+    if (options_.splitChannels && kind_ == OutputKind::wav) outputs_->checkNumbered("wav");
+}
+
+void Job::openInputs() {
+    if (options_.inputs.empty()) throw Failure(Exit::usage, "no input; give a file or testgen:...");
+    for (const auto& name : options_.inputs) {
+        sources_.push_back(std::make_unique<Source>(name, options_.raw));
+        sources_.back()->selectAll();
+    }
+    checkDamage();
+}
+
+// A cut input is refused unless the user takes what is there.
+void Job::checkDamage() const {
+    for (const auto& source : sources_) {
+        const std::string damage = source->damage();
+        if (damage.empty()) continue;
+        if (!options_.acceptPartial)
+            throw Failure(Exit::input, quoted(source->name()) + " is damaged: " + damage +
+                                           "; --accept-partial takes what is there");
+        warnings_.push_back(quoted(source->name()) + " is damaged: " + damage);
+    }
+}
+
+void Job::planStreams() {
+    for (const auto& source : sources_)
+        for (int type : {kVideo, kAudio}) {
+            if (type == kVideo && kind_ == OutputKind::wav) continue;
+            for (int i = 0; i < source->decoder().nrStreams(type); ++i) planStream(*source, type, i);
+        }
+    if (!streams_.empty()) return;
+    throw Failure(Exit::input, kind_ == OutputKind::wav ? "no input has sound for " + quoted(options_.output)
+                                                        : std::string("no input has a picture or sound"));
+}
+
+void Job::planStream(Source& source, int type, int number) {
+    const QvDecodePipe& decoder = source.decoder();
+    JobStream stream{};
+    stream.type = type;
+    stream.source = &source;
+    stream.decStream = number;
+    stream.encStream = static_cast<int>(
+        std::count_if(streams_.begin(), streams_.end(), [&](const auto& s) { return s.type == type; }));
+    if (type == kVideo) {
+        stream.width = options_.size ? options_.size->width : intParam(decoder, type, number, "width");
+        stream.height = options_.size ? options_.size->height : intParam(decoder, type, number, "height");
+        stream.fourcc = options_.pixel ? *options_.pixel
+                                       : static_cast<unsigned>(intParam(decoder, type, number, "FOURCC"));
+        const Any rate = decoder.getStreamParam(type, number, "framerate");
+        stream.rate = options_.rate ? *options_.rate : rate.isFramerate() ? rate.asFramerate() : QvFramerate(25.0);
+    } else {
+        stream.samplerate = options_.samplerate.value_or(intParam(decoder, type, number, "samplerate"));
+        stream.channels = options_.channels.value_or(intParam(decoder, type, number, "channels"));
+        stream.bits = options_.bits.value_or(intParam(decoder, type, number, "bitsPerSample"));
+    }
+    streams_.push_back(std::move(stream));
+}
+
+void Job::planPoints() {
+    for (JobStream& stream : streams_) {
+        QvDecodePipe& decoder = stream.source->decoder();
+        const auto rate = stream.source->frameRate();
+        const MediaTime length = decoder.duration(stream.type, stream.decStream);
+        stream.in = MediaTime(0LL, kTicks);
+        stream.out = length;
+        if (!options_.from.empty()) stream.in = parseTime(options_.from, rate, "--from");
+        if (!options_.to.empty()) stream.out = parseTime(options_.to, rate, "--to");
+        if (stream.out <= stream.in && !options_.to.empty() && !options_.from.empty())
+            throw Failure(Exit::usage, "--to " + options_.to + " is not behind --from " + options_.from);
+        if (stream.in >= length)
+            throw Failure(Exit::usage, "--from " + options_.from + " lies behind the end of " +
+                                           quoted(stream.source->name()) + " (" + formatTime(length.seconds()) + ")");
+        if (stream.out > length) {
+            if (stream.type == kVideo || !hasVideo())
+                warnings_.push_back("--to " + options_.to + " lies behind the end of " +
+                                    quoted(stream.source->name()) + "; stopped at " + formatTime(length.seconds()));
+            stream.out = length;
+        }
+    }
+}
+
+void Job::planLengths() {
+    const JobStream* video = nullptr;
+    for (JobStream& stream : streams_) {
+        const Any inRate = stream.source->decoder().getStreamParam(stream.type, stream.decStream,
+                                                                   stream.type == kVideo ? "framerate" : "samplerate");
+        if (stream.type == kVideo) {
+            const QvRatio from = inRate.asFramerate().rate();
+            stream.inUnits = stream.out.position(from) - stream.in.position(from);
+            stream.expected = QvRatio::multyplyByRatio(stream.inUnits, from, stream.rate.rate());
+            // A whole number of pairs goes into a halving.
+            if (std::abs(2.0 * stream.rate.rate() - static_cast<double>(from)) < 1e-4 && stream.inUnits % 2)
+                stream.expected = (stream.inUnits + 1) / 2;
+            video = &stream;
+        }
+    }
+    for (JobStream& stream : streams_) {
+        if (stream.type != kAudio) continue;
+        if (video)
+            stream.expected = QvUtil::samplesForFrames(static_cast<int>(video->expected), video->rate, stream.samplerate);
+        else
+            stream.expected = stream.out.position(stream.samplerate) - stream.in.position(stream.samplerate);
+        stream.inUnits = stream.expected;
+    }
+}
+
+std::string Job::primaryExtension() const {
+    switch (kind_) {
+        case OutputKind::wav: return "wav";
+        case OutputKind::avi: return "avi";
+        case OutputKind::pictures: return "png";
+        default: return "raw";
+    }
+}
+
+void Job::buildPipe() {
+    pipe_.reset(QvEncodePipe::create());
+    if (!pipe_) throw Failure(Exit::module, "this installation can't write any output");
+    if (kind_ == OutputKind::avi) {
+        if (!qvPresetMgr()->profileAvailable(QvProfile::aviRaw))
+            throw Failure(Exit::module, "this installation has no AVI output");
+        pipe_->applyPreset(QvProfile::aviRaw, 0);
+    }
+    pipe_->clearStreams();
+    const char* muxer = kind_ == OutputKind::nothing ? "nullmux" : kind_ == OutputKind::avi ? "rawavimux" : "rawmux";
+    if (std::string_view(pipe_->getMuxer() ? pipe_->getMuxer()->name() : "") != muxer &&
+        pipe_->setMuxer(muxer) != QvStatus::ok)
+        throw Failure(Exit::module, std::string("the multiplexer ") + muxer + " can't be used: " + pipe_->errorDesc());
+    QvMuxer& m = *pipe_->getMuxer();
+    if (kind_ == OutputKind::pictures) {
+        m.setParam("splitVideo", 1);
+        m.setParam("rawAsPng", 1);
+    }
+    if (options_.splitChannels) setChecked(m, "splitAudio", 1, "--split-channels");
+    for (JobStream& stream : streams_) addStream(stream);
+}
+
+void Job::addStream(JobStream& stream) {
+    const char* module = stream.type == kVideo ? "rawvenc" : "rawaenc";
+    if (pipe_->addStream(stream.type, Any(module)) < 0)
+        throw Failure(Exit::output, std::string("the output takes no further ") +
+                                        (stream.type == kVideo ? "picture" : "sound") + ": " + pipe_->errorDesc());
+    QvEncoder& encoder = *pipe_->encoder(stream.type, stream.encStream);
+    if (stream.type == kVideo) {
+        setChecked(encoder, "type", static_cast<int>(stream.fourcc), "--pixel");
+        setChecked(encoder, "width", stream.width, "--size");
+        setChecked(encoder, "height", stream.height, "--size");
+        setChecked(encoder, "framerate", Any(stream.rate), "--rate");
+    } else {
+        setChecked(encoder, "samplerate", stream.samplerate, "--samplerate");
+        setChecked(encoder, "channels", stream.channels, "--channels");
+        setChecked(encoder, "bitsPerSample", stream.bits, "--bits");
+    }
+}
+
+void Job::applyFilters(ProcessParams& params, int type) const {
+    FiltersState state;
+    bool any = false;
+    for (const auto& spec : options_.filters) {
+        const size_t colon = spec.find(':');
+        const std::string name = spec.substr(0, colon);
+        const QvModule* module = qv_registry()->module(name.c_str());
+        const int kind = module ? module->getAttr("type").toInt32() : 0;
+        if (kind != kVideoFilter && kind != kAudioFilter) makeAnyCodec(name, kVideoFilter);  // says what is wrong
+        if (kind != (type == kVideo ? kVideoFilter : kAudioFilter)) continue;
+        const auto filter = makeAnyCodec(name, kind);
+        const KeyValues keys(colon == std::string::npos ? "" : spec.substr(colon + 1), {}, "--filter " + name);
+        AnyDict stored;
+        for (const auto& [key, value] : keys.all()) setChecked(*filter, key, valueOf(value), "--filter " + name);
+        filter->store(stored);
+        stored.set("_on", 1);
+        state.appendFilter(name.c_str(), stored);
+        any = true;
+    }
+    if (any) params.setFilters(state);
+}

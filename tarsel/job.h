@@ -1,0 +1,87 @@
+// A transcode of the tool: resolved from options to a plan, then run, checked and put in place.
+#pragma once
+
+#include <memory>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include <qvplugcore/qvplugcore.h>
+
+#include "failure.h"
+#include "outputs.h"
+#include "progress.h"
+#include "signals.h"
+#include "source.h"
+
+struct JobOptions {
+    std::vector<std::string> inputs;
+    std::string output, raw, from, to, muxer, saveTask;
+    std::optional<Size> size;
+    std::optional<QvFramerate> rate;
+    std::optional<unsigned> pixel;
+    std::optional<int> samplerate, channels, bits;
+    std::vector<std::string> filters;
+    ProgressMode progress = ProgressMode::automatic;
+    bool overwrite = false, splitChannels = false, dryRun = false, acceptPartial = false, quiet = false;
+};
+
+// What an output name stands for.
+enum class OutputKind { raw, wav, pictures, avi, nothing };
+
+// One stream from an input to the output, with what it will be.
+struct JobStream {
+    int type;  // 1 video, 2 audio
+    Source* source;
+    int decStream, encStream;
+    // The format of the output.
+    int width = 0, height = 0;
+    unsigned fourcc = 0;
+    QvFramerate rate;
+    int samplerate = 0, channels = 0, bits = 0;
+    MediaTime in, out;             // in the source
+    long long inUnits = 0;         // frames or samples between the points
+    long long expected = 0;        // frames or samples of the output
+    long long written = -1;        // after the run
+    long long bytes() const;       // of `expected`, without headers
+};
+
+class Job {
+  public:
+    Job(const JobOptions& options, Signals& signals);
+    ~Job();
+
+    // Prints the plan to the standard output.
+    void printPlan() const;
+    void saveTask() const;
+    // Runs, checks and commits. Throws Failure.
+    void run();
+
+  private:
+    class Runner;
+
+    void openInputs();
+    void chooseOutput();
+    void planStreams();
+    void planStream(Source& source, int type, int number);
+    void planPoints();
+    void planLengths();
+    void buildPipe();
+    void addStream(JobStream& stream);
+    void applyFilters(ProcessParams& params, int type) const;
+    void checkDamage() const;
+    void checkSpace() const;
+    void checkResult(const std::vector<std::string>& names) const;
+    [[noreturn]] void fail(Runner& runner) const;
+    std::string primaryExtension() const;
+    bool hasVideo() const;
+
+    JobOptions options_;
+    Signals& signals_;
+    OutputKind kind_ = OutputKind::raw;
+    std::vector<std::unique_ptr<Source>> sources_;
+    std::vector<JobStream> streams_;
+    std::unique_ptr<Outputs> outputs_;
+    std::unique_ptr<QvEncodePipe> pipe_;
+    mutable std::vector<std::string> warnings_;
+};
