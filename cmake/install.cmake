@@ -7,7 +7,7 @@ set(QV_INCLUDE_ROOT ${CMAKE_INSTALL_INCLUDEDIR}/qvplugcore)
 install(TARGETS qvplugcore EXPORT qvplugcore-targets LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR})
 install(DIRECTORY ${CMAKE_SOURCE_DIR}/core DESTINATION ${QV_INCLUDE_ROOT}
         FILES_MATCHING PATTERN "*.h" PATTERN "posix" EXCLUDE PATTERN "*_p.h" EXCLUDE)
-install(FILES ${CMAKE_SOURCE_DIR}/core/qvplugcore.h DESTINATION ${QV_INCLUDE_ROOT})
+install(FILES ${CMAKE_BINARY_DIR}/include/qvplugcore/qvplugcore.h DESTINATION ${QV_INCLUDE_ROOT})
 install(EXPORT qvplugcore-targets DESTINATION ${CMAKE_INSTALL_LIBDIR}/cmake/qvplugcore)
 
 file(WRITE ${CMAKE_BINARY_DIR}/qvplugcore-config.cmake

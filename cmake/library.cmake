@@ -13,11 +13,22 @@ target_link_libraries(qv_objects PUBLIC
   PkgConfig::FONTCONFIG PkgConfig::HARFBUZZ PkgConfig::FRIBIDI PkgConfig::CRYPTOPP PkgConfig::HWY
   ${CMAKE_DL_LIBS})
 
+# <qvplugcore/qvplugcore.h> includes every public header, room by room.
+set(QV_UMBRELLA "// The whole public interface of the engine.\n#pragma once\n\n")
+foreach(room arch value engine media stream decode encode filter transcode batch caption preset compose)
+  file(GLOB headers RELATIVE ${CMAKE_SOURCE_DIR} CONFIGURE_DEPENDS ${CMAKE_SOURCE_DIR}/core/${room}/*.h)
+  list(FILTER headers EXCLUDE REGEX "_p\\.h$")
+  foreach(header ${headers})
+    string(APPEND QV_UMBRELLA "#include \"${header}\"\n")
+  endforeach()
+endforeach()
+file(CONFIGURE OUTPUT ${CMAKE_BINARY_DIR}/include/qvplugcore/qvplugcore.h CONTENT "${QV_UMBRELLA}" @ONLY)
+
 add_library(qvplugcore SHARED $<TARGET_OBJECTS:qv_objects>)
 target_link_libraries(qvplugcore PRIVATE qv_objects)
 set_target_properties(qvplugcore PROPERTIES VERSION ${PROJECT_VERSION} SOVERSION ${PROJECT_VERSION_MAJOR})
 target_include_directories(qvplugcore INTERFACE
-  $<BUILD_INTERFACE:${CMAKE_SOURCE_DIR}>
+  $<BUILD_INTERFACE:${CMAKE_SOURCE_DIR}> $<BUILD_INTERFACE:${CMAKE_BINARY_DIR}/include>
   $<INSTALL_INTERFACE:include> $<INSTALL_INTERFACE:include/qvplugcore>)
 
 add_library(qv_static STATIC EXCLUDE_FROM_ALL $<TARGET_OBJECTS:qv_objects>)

@@ -12,6 +12,9 @@ endif()
 
 add_compile_options(-Wall -Wextra -Wconversion -fno-math-errno -ffp-contract=off
                     -fmacro-prefix-map=${CMAKE_SOURCE_DIR}/=)
+if(CMAKE_CXX_COMPILER_ID STREQUAL GNU)
+  add_compile_options(-Wno-restrict)  # GCC 12 sees overlaps in std::string that are not there
+endif()
 if(QV_WERROR)
   add_compile_options(-Werror)
 endif()

@@ -38,7 +38,7 @@ std::string suggestion(std::string_view unknown, const std::vector<std::string>&
     return text + "?";
 }
 
-std::string quoted(std::string_view text) {
+std::string inQuotes(std::string_view text) {
     std::string out = "'";
     for (const char c : text) {
         const auto byte = static_cast<unsigned char>(c);

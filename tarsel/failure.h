@@ -31,4 +31,4 @@ class Failure : public std::runtime_error {
 std::string suggestion(std::string_view unknown, const std::vector<std::string>& known);
 
 // A file name or text for a message: control characters and stray bytes are escaped, quotes are around it.
-std::string quoted(std::string_view text);
+std::string inQuotes(std::string_view text);

@@ -1,6 +1,7 @@
 #include "job.h"
 
 #include <algorithm>
+#include <charconv>
 #include <cstdio>
 #include <filesystem>
 
@@ -85,8 +86,8 @@ void Job::chooseOutput() {
     if (row == std::end(kKinds) && !device) {
         std::vector<std::string> known;
         for (const auto& r : kKinds) known.push_back(r.extension);
-        throw Failure(Exit::usage, "-o " + quoted(options_.output) + ": no output has the extension " +
-                                       quoted(extension) + "." + suggestion(extension, known) +
+        throw Failure(Exit::usage, "-o " + inQuotes(options_.output) + ": no output has the extension " +
+                                       inQuotes(extension) + "." + suggestion(extension, known) +
                                        " 'tarsel formats' lists all");
     }
     kind_ = row == std::end(kKinds) ? OutputKind::raw : row->kind;
@@ -110,9 +111,9 @@ void Job::checkDamage() const {
         const std::string damage = source->damage();
         if (damage.empty()) continue;
         if (!options_.acceptPartial)
-            throw Failure(Exit::input, quoted(source->name()) + " is damaged: " + damage +
+            throw Failure(Exit::input, inQuotes(source->name()) + " is damaged: " + damage +
                                            "; --accept-partial takes what is there");
-        warnings_.push_back(quoted(source->name()) + " is damaged: " + damage);
+        warnings_.push_back(inQuotes(source->name()) + " is damaged: " + damage);
     }
 }
 
@@ -123,7 +124,7 @@ void Job::planStreams() {
             for (int i = 0; i < source->decoder().nrStreams(type); ++i) planStream(*source, type, i);
         }
     if (!streams_.empty()) return;
-    throw Failure(Exit::input, kind_ == OutputKind::wav ? "no input has sound for " + quoted(options_.output)
+    throw Failure(Exit::input, kind_ == OutputKind::wav ? "no input has sound for " + inQuotes(options_.output)
                                                         : std::string("no input has a picture or sound"));
 }
 
@@ -163,11 +164,11 @@ void Job::planPoints() {
             throw Failure(Exit::usage, "--to " + options_.to + " is not behind --from " + options_.from);
         if (stream.in >= length)
             throw Failure(Exit::usage, "--from " + options_.from + " lies behind the end of " +
-                                           quoted(stream.source->name()) + " (" + formatTime(length.seconds()) + ")");
+                                           inQuotes(stream.source->name()) + " (" + formatTime(length.seconds()) + ")");
         if (stream.out > length) {
             if (stream.type == kVideo || !hasVideo())
                 warnings_.push_back("--to " + options_.to + " lies behind the end of " +
-                                    quoted(stream.source->name()) + "; stopped at " + formatTime(length.seconds()));
+                                    inQuotes(stream.source->name()) + "; stopped at " + formatTime(length.seconds()));
             stream.out = length;
         }
     }

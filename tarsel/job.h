@@ -13,6 +13,7 @@
 #include "progress.h"
 #include "signals.h"
 #include "source.h"
+#include "timespec.h"
 
 struct JobOptions {
     std::vector<std::string> inputs;

@@ -89,7 +89,7 @@ void Job::checkSpace() const {
     if (kind_ != OutputKind::pictures)
         for (const JobStream& stream : streams_) need += stream.bytes();
     if (space >= 0 && need > space && fs::is_directory(fs::absolute(outputs_->output()).parent_path()))
-        throw Failure(Exit::output, "can't write " + quoted(outputs_->output().string()) + ": it needs " +
+        throw Failure(Exit::output, "can't write " + inQuotes(outputs_->output().string()) + ": it needs " +
                                         formatBytes(need) + ", the disk has " + formatBytes(space) + " free");
 }
 
@@ -136,8 +136,8 @@ void Job::run() {
     if (outputs_) names = outputs_->commit("raw");
     for (const auto& warning : warnings_) std::fprintf(stderr, "tarsel: warning: %s\n", warning.c_str());
     if (options_.quiet) return;
-    std::string where = names.empty() ? "nothing" : quoted(names.front());
-    if (names.size() > 1) where += names.size() == 2 ? " and " + quoted(names[1])
+    std::string where = names.empty() ? "nothing" : inQuotes(names.front());
+    if (names.size() > 1) where += names.size() == 2 ? " and " + inQuotes(names[1])
                                                      : " and " + std::to_string(names.size() - 1) + " more files";
     std::fprintf(stderr, "tarsel: wrote %s", where.c_str());
     for (const JobStream& s : streams_)
@@ -149,7 +149,7 @@ void Job::run() {
 void Job::fail(Runner& runner) const {
     for (const auto& source : sources_)
         if (source->decoder().errorCode() < 0 && source->decoder().errorCode() != QvStatus::endOfStream)
-            throw Failure(Exit::input, "can't read " + quoted(source->name()) + ": " + source->decoder().errorDesc());
+            throw Failure(Exit::input, "can't read " + inQuotes(source->name()) + ": " + source->decoder().errorDesc());
     std::string reason;
     const auto take = [&](const QvCodec* codec) {
         if (reason.empty() && codec && codec->errorCode() != 0) reason = codec->errorDesc();
@@ -164,7 +164,7 @@ void Job::fail(Runner& runner) const {
     take(pipe_.get());
     if (reason.empty()) throw Failure(Exit::failed, runner.errorDesc());
     throw Failure(Exit::output,
-                  (outputs_ ? "can't write " + quoted(outputs_->output().string()) + ": " : "") + reason);
+                  (outputs_ ? "can't write " + inQuotes(outputs_->output().string()) + ": " : "") + reason);
 }
 
 // Compares what was written with what the job asked for; an input that ended early is told apart.
@@ -172,7 +172,7 @@ void Job::checkResult(const std::vector<std::string>&) const {
     for (const JobStream& s : streams_) {
         if (s.written >= s.expected) continue;
         const char* unit = s.type == 1 ? "frames" : "samples";
-        const std::string line = quoted(s.source->name()) + " ended early: " + std::to_string(s.written) + " of " +
+        const std::string line = inQuotes(s.source->name()) + " ended early: " + std::to_string(s.written) + " of " +
                                  std::to_string(s.expected) + " " + unit + " were read";
         if (!options_.acceptPartial)
             throw Failure(Exit::input, line + "; --accept-partial keeps what is there");
@@ -186,6 +186,6 @@ void Job::checkResult(const std::vector<std::string>&) const {
     const auto bytes = static_cast<long long>(fs::file_size(name.asVector().at(0).asString(), error));
     const long long wanted = first->expected > 0 ? first->bytes() / first->expected * first->written : 0;
     if (bytes != wanted)
-        throw Failure(Exit::check, quoted(options_.output) + " has " + std::to_string(bytes) + " bytes instead of " +
+        throw Failure(Exit::check, inQuotes(options_.output) + " has " + std::to_string(bytes) + " bytes instead of " +
                                        std::to_string(wanted));
 }

@@ -17,7 +17,7 @@ namespace {
 fs::path folderOf(const fs::path& name) { return name.has_parent_path() ? name.parent_path() : fs::path("."); }
 
 [[noreturn]] void refuse(const fs::path& name, const std::string& why) {
-    throw Failure(Exit::output, "can't write " + quoted(name.string()) + ": " + why);
+    throw Failure(Exit::output, "can't write " + inQuotes(name.string()) + ": " + why);
 }
 
 bool sameFile(const fs::path& a, const fs::path& b) {
@@ -34,9 +34,9 @@ Outputs::Outputs(const std::string& output, const std::vector<std::string>& inpu
     if (fs::is_directory(output_, error)) refuse(output_, "this is a folder; give a file name in it");
     const fs::path folder = folderOf(output_);
     if (!fs::is_directory(folder, error))
-        refuse(output_, "the folder " + quoted(folder.string()) + " does not exist");
+        refuse(output_, "the folder " + inQuotes(folder.string()) + " does not exist");
     if (::access(folder.c_str(), W_OK | X_OK) != 0)
-        refuse(output_, "the folder " + quoted(folder.string()) + " may not be written");
+        refuse(output_, "the folder " + inQuotes(folder.string()) + " may not be written");
     checkFinal(output_);
 }
 

@@ -48,11 +48,11 @@ double parseAspect(const std::string& text, const std::string& option) {
 std::unique_ptr<QvCodec> makeAnyCodec(const std::string& module, int kind) {
     const QvModule* found = qv_registry()->module(module.c_str());
     if (!found || found->getAttr("type").toInt32() != kind)
-        throw Failure(Exit::module, "there is no module " + quoted(module) + " of this kind." +
+        throw Failure(Exit::module, "there is no module " + inQuotes(module) + " of this kind." +
                                         suggestion(module, moduleNames(kind)) + " 'tarsel modules' lists all");
     std::unique_ptr<QvCodec> codec(qv_registry()->newCodec(module.c_str()));
     if (!codec)
-        throw Failure(Exit::module, "the module " + quoted(module) + " can't be used in this installation");
+        throw Failure(Exit::module, "the module " + inQuotes(module) + " can't be used in this installation");
     return codec;
 }
 
@@ -61,16 +61,16 @@ void setChecked(QvCodec& codec, const std::string& name, const Any& value, const
     try {
         result = codec.setParam(name.c_str(), value);
     } catch (const QvParamException&) {
-        throw Failure(Exit::usage, what + ": " + codec.name() + " has no parameter " + quoted(name));
+        throw Failure(Exit::usage, what + ": " + codec.name() + " has no parameter " + inQuotes(name));
     }
     if (result == QvStatus::ok) return;
-    throw Failure(Exit::usage, what + ": " + codec.name() + " can't take this value for " + quoted(name));
+    throw Failure(Exit::usage, what + ": " + codec.name() + " can't take this value for " + inQuotes(name));
 }
 
 Source::Source(const std::string& spec, const std::string& raw) : name_(spec) {
     if (spec.rfind(kGenerator, 0) == 0 || spec == "testgen") {
         isFile_ = false;
-        if (!raw.empty()) throw Failure(Exit::usage, "--raw describes a file; " + quoted(spec) + " is none");
+        if (!raw.empty()) throw Failure(Exit::usage, "--raw describes a file; " + inQuotes(spec) + " is none");
         openGenerator(spec);
         return;
     }
@@ -94,7 +94,7 @@ Source::Source(const std::string& spec, const std::string& raw) : name_(spec) {
 }
 
 void Source::refuse(const std::string& why) const {
-    throw Failure(Exit::input, "can't open " + quoted(name_) + ": " + why);
+    throw Failure(Exit::input, "can't open " + inQuotes(name_) + ": " + why);
 }
 
 void Source::openGenerator(const std::string& spec) {
@@ -123,7 +123,7 @@ void Source::openGenerator(const std::string& spec) {
         video.set("frameAspect", parseAspect(*aspect, option + ": aspect"));
     if (const std::string* picture = keys.find("picture")) {
         if (!std::filesystem::is_regular_file(*picture))
-            throw Failure(Exit::input, "can't open the picture " + quoted(*picture));
+            throw Failure(Exit::input, "can't open the picture " + inQuotes(*picture));
         video.set("picture", picture->c_str());
     }
     audio.set("duration", Any(duration));
@@ -186,7 +186,7 @@ void Source::openFile() {
         for (int i = 0; i < exts->size(); ++i) known.push_back(exts->at(i).asString());
         if (std::find(known.begin(), known.end(), ext.asString()) != known.end())
             refuse("a raw file has no header; give its format with --raw size=WxH,pixel=FORMAT,rate=R");
-        refuse("no decoder for the extension " + quoted(ext.asString()) + "; 'tarsel formats' lists what opens");
+        refuse("no decoder for the extension " + inQuotes(ext.asString()) + "; 'tarsel formats' lists what opens");
     }
     refuse(log.lastFailure.empty() ? "no decoder can read it" : log.lastFailure);
 }

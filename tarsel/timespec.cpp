@@ -13,7 +13,7 @@ constexpr long long kTicks = 35280000;              // a second of MediaTime
 constexpr long long kLongest = 1000LL * 3600 * 24;  // seconds; a bound, not a wish
 
 [[noreturn]] void refuse(std::string_view option, std::string_view text, std::string_view wanted) {
-    throw Failure(Exit::usage, std::string(option) + ": " + quoted(text) + " is not " + std::string(wanted));
+    throw Failure(Exit::usage, std::string(option) + ": " + inQuotes(text) + " is not " + std::string(wanted));
 }
 
 std::optional<long long> number(std::string_view text) {
@@ -72,7 +72,7 @@ MediaTime parseTime(std::string_view text, const std::optional<QvFramerate>& rat
         "a time: use SS[.mmm], MM:SS, HH:MM:SS[.mmm], 120f, HH:MM:SS:FF or HH:MM:SS;FF";
     const auto needRate = [&]() -> const QvFramerate& {
         if (!rate)
-            throw Failure(Exit::usage, std::string(option) + ": " + quoted(text) +
+            throw Failure(Exit::usage, std::string(option) + ": " + inQuotes(text) +
                                            " counts frames, but the input has no frame rate; give seconds");
         return *rate;
     };
@@ -89,7 +89,7 @@ MediaTime parseTime(std::string_view text, const std::optional<QvFramerate>& rat
         }
         QvFramerate counting = needRate();
         const QvTimecode code{std::string(text).c_str()};
-        counting.setDf(code.df);
+        counting.setDf(code.df());
         const long long frame = code.frameNr(counting, false);
         return MediaTime(frame, counting, kTicks);
     }

@@ -35,6 +35,8 @@ bool isPair(unsigned a, unsigned b, unsigned first, unsigned second) {
 
 }  // namespace
 
+std::span<const QvPixelFormat> qvPixelFormats() { return formats; }
+
 const QvPixelFormat* qvPixelFormat(unsigned fourcc) {
     for (const auto& format : formats)
         if (format.fourcc == fourcc) return &format;

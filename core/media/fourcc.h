@@ -2,6 +2,7 @@
 #pragma once
 
 #include <array>
+#include <span>
 #include <string>
 
 #include "core/arch/api.h"
@@ -55,6 +56,9 @@ struct QvPixelFormat {
 
     constexpr int planes() const { return chroma == QvChroma::none ? 1 : 3; }
 };
+
+// All formats.
+QV_API std::span<const QvPixelFormat> qvPixelFormats();
 
 // The row of a format, or null for an unknown FOURCC.
 QV_API const QvPixelFormat* qvPixelFormat(unsigned fourcc);

@@ -1,0 +1,102 @@
+// tarsel: the command-line tool of the engine.
+#include <clocale>
+#include <cstdio>
+#include <cstdlib>
+#include <memory>
+#include <new>
+
+#include <CLI/CLI.hpp>
+#include <qvplugcore/qvplugcore.h>
+
+#include "commands.h"
+#include "failure.h"
+#include "signals.h"
+
+namespace {
+
+// The engine, from the first command to the end of the program.
+class Engine {
+  public:
+    Engine(const std::string& log, const std::string& plugins) {
+        AnyDict config;
+        if (!log.empty()) config.set("logfile", log.c_str());
+        init_wrapper(&config);
+        if (!plugins.empty() && qv_registry()->scanFolder(Any(plugins.c_str())) != QvStatus::ok)
+            std::fprintf(stderr, "tarsel: warning: no plug-ins in %s\n", inQuotes(plugins).c_str());
+        qvPresetMgr()->update();
+    }
+    ~Engine() { cleanup_wrapper(); }
+};
+
+std::vector<std::string> subcommandNames(const CLI::App& app) {
+    std::vector<std::string> names;
+    for (const CLI::App* sub : app.get_subcommands({})) names.push_back(sub->get_name());
+    return names;
+}
+
+int status(Exit exit) { return static_cast<int>(exit); }
+
+int say(Exit exit, const std::string& line) {
+    std::fprintf(stderr, "tarsel: %s\n", line.c_str());
+    return status(exit);
+}
+
+// Wrong use: the parser's words, with near matches for an unknown command or option.
+int wrongUse(const CLI::App& app, const CLI::ParseError& error, int argc, char** argv) {
+    std::string line = error.what();
+    for (auto& c : line)
+        if (c == '\n') c = ' ';
+    const CLI::App* used = &app;
+    for (const CLI::App* sub : app.get_subcommands()) used = sub;
+    std::vector<std::string> known = used == &app ? subcommandNames(app) : std::vector<std::string>();
+    for (const CLI::Option* option : used->get_options())
+        for (const auto& name : option->get_lnames()) known.push_back("--" + name);
+    for (int i = 1; i < argc; ++i) {
+        const std::string word = std::string(argv[i]).substr(0, std::string(argv[i]).find('='));
+        if (line.find(word) != std::string::npos && std::find(known.begin(), known.end(), word) == known.end())
+            line += suggestion(word, known);
+    }
+    const std::string help = used == &app ? "tarsel --help" : "tarsel " + used->get_name() + " --help";
+    return say(Exit::usage, line + " See '" + help + "'");
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+    std::setlocale(LC_ALL, "C");
+    Signals signals;
+    CLI::App app("Transcodes, inspects and draws media from the command line.", "tarsel");
+    app.require_subcommand(1);
+    app.set_version_flag("--version", std::string("tarsel ") + QvUtil::libraryVersion().asString());
+    std::string log, plugins;
+    app.add_option("--log", log, "Write the engine's log to FILE, or to stderr")->type_name("FILE");
+    app.add_option("--plugins", plugins, "Load the plug-ins of FOLDER")->type_name("FOLDER")->envname("TARSEL_PLUGINS");
+    Action chosen;
+    addTranscode(app, chosen, signals);
+    addInfo(app, chosen);
+    addFrame(app, chosen, signals);
+    addModules(app, chosen);
+    addFormats(app, chosen);
+    addPresets(app, chosen);
+    try {
+        app.parse(argc, argv);
+    } catch (const CLI::Success& shown) {
+        return app.exit(shown);
+    } catch (const CLI::ParseError& error) {
+        return wrongUse(app, error, argc, argv);
+    }
+    try {
+        Engine engine(log, plugins);
+        chosen();
+        if (std::fflush(stdout) != 0 || std::ferror(stdout)) return say(Exit::output, "can't write to the standard output");
+        return status(Exit::done);
+    } catch (const Failure& failure) {
+        return say(failure.exit(), failure.what());
+    } catch (const QvException& failure) {
+        return say(Exit::failed, failure.what());
+    } catch (const std::bad_alloc&) {
+        return say(Exit::failed, "out of memory");
+    } catch (const std::exception& failure) {
+        return say(Exit::failed, failure.what());
+    }
+}
