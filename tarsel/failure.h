@@ -10,10 +10,10 @@ enum class Exit : int {
     done = 0,
     failed = 1,
     usage = 2,
-    input = 3,    // can't be opened, or is damaged
-    output = 4,   // can't be written
-    module = 5,   // a module is missing
-    check = 6,    // the result is not what the job asked for
+    input = 3,   // can't be opened, or is damaged
+    output = 4,  // can't be written
+    module = 5,  // a module is missing
+    check = 6,   // the result is not what the job asked for
     interrupted = 130,
     terminated = 143,
 };

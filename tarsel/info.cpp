@@ -38,7 +38,9 @@ Json describeStream(const QvDecodePipe& decoder, int type, int number) {
         if (p.get("framerate").isFramerate()) {
             const QvFramerate rate = p.get("framerate").asFramerate();
             stream["rate"] = std::to_string(rate.rate().num) + "/" + std::to_string(rate.rate().den);
-            stream["scan"] = rate.interlaced() == 0 ? "progressive" : rate.isTopFirst() ? "top first" : "bottom first";
+            stream["scan"] = rate.interlaced() == 0 ? "progressive"
+                             : rate.isTopFirst()    ? "top first"
+                                                    : "bottom first";
         }
         if (p.get("frameAspect").isDouble()) stream["frame_aspect"] = p.get("frameAspect").asDouble();
         integer("frames", "frames");
@@ -73,7 +75,8 @@ Json describe(const Source& source) {
 void print(const Json& file) {
     std::printf("%s\n", inQuotes(file["file"].get<std::string>()).c_str());
     std::printf("  decoder   %s\n", file["decoder"].get<std::string>().c_str());
-    if (file.contains("bytes")) std::printf("  size      %s\n", formatBytes(file["bytes"].get<long long>()).c_str());
+    if (file.contains("bytes"))
+        std::printf("  size      %s\n", formatBytes(file["bytes"].get<long long>()).c_str());
     if (!file["duration_s"].is_null())
         std::printf("  duration  %s\n", formatTime(file["duration_s"].get<double>()).c_str());
     for (const auto& s : file["streams"]) {
@@ -101,7 +104,8 @@ void addInfo(CLI::App& app, Action& chosen) {
     };
     auto given = std::make_shared<Given>();
     command->add_option("FILE", given->files, "Files, or testgen:...")->required();
-    command->add_option("--raw", given->raw, "Format of a raw file: size=WxH,pixel=FORMAT,rate=R")->type_name("K=V,...");
+    command->add_option("--raw", given->raw, "Format of a raw file: size=WxH,pixel=FORMAT,rate=R")
+        ->type_name("K=V,...");
     command->add_flag("--json", given->json, "Print JSON, one array of files");
     command->callback([&chosen, given] {
         chosen = [given] {

@@ -124,8 +124,9 @@ void Job::planStreams() {
             for (int i = 0; i < source->decoder().nrStreams(type); ++i) planStream(*source, type, i);
         }
     if (!streams_.empty()) return;
-    throw Failure(Exit::input, kind_ == OutputKind::wav ? "no input has sound for " + inQuotes(options_.output)
-                                                        : std::string("no input has a picture or sound"));
+    throw Failure(Exit::input, kind_ == OutputKind::wav
+                                   ? "no input has sound for " + inQuotes(options_.output)
+                                   : std::string("no input has a picture or sound"));
 }
 
 void Job::planStream(Source& source, int type, int number) {
@@ -142,7 +143,9 @@ void Job::planStream(Source& source, int type, int number) {
         stream.fourcc = options_.pixel ? *options_.pixel
                                        : static_cast<unsigned>(intParam(decoder, type, number, "FOURCC"));
         const Any rate = decoder.getStreamParam(type, number, "framerate");
-        stream.rate = options_.rate ? *options_.rate : rate.isFramerate() ? rate.asFramerate() : QvFramerate(25.0);
+        stream.rate = options_.rate        ? *options_.rate
+                      : rate.isFramerate() ? rate.asFramerate()
+                                           : QvFramerate(25.0);
     } else {
         stream.samplerate = options_.samplerate.value_or(intParam(decoder, type, number, "samplerate"));
         stream.channels = options_.channels.value_or(intParam(decoder, type, number, "channels"));
@@ -164,11 +167,13 @@ void Job::planPoints() {
             throw Failure(Exit::usage, "--to " + options_.to + " is not behind --from " + options_.from);
         if (stream.in >= length)
             throw Failure(Exit::usage, "--from " + options_.from + " lies behind the end of " +
-                                           inQuotes(stream.source->name()) + " (" + formatTime(length.seconds()) + ")");
+                                           inQuotes(stream.source->name()) + " (" +
+                                           formatTime(length.seconds()) + ")");
         if (stream.out > length) {
             if (stream.type == kVideo || !hasVideo())
                 warnings_.push_back("--to " + options_.to + " lies behind the end of " +
-                                    inQuotes(stream.source->name()) + "; stopped at " + formatTime(length.seconds()));
+                                    inQuotes(stream.source->name()) + "; stopped at " +
+                                    formatTime(length.seconds()));
             stream.out = length;
         }
     }
@@ -177,8 +182,8 @@ void Job::planPoints() {
 void Job::planLengths() {
     const JobStream* video = nullptr;
     for (JobStream& stream : streams_) {
-        const Any inRate = stream.source->decoder().getStreamParam(stream.type, stream.decStream,
-                                                                   stream.type == kVideo ? "framerate" : "samplerate");
+        const Any inRate = stream.source->decoder().getStreamParam(
+            stream.type, stream.decStream, stream.type == kVideo ? "framerate" : "samplerate");
         if (stream.type == kVideo) {
             const QvRatio from = inRate.asFramerate().rate();
             stream.inUnits = stream.out.position(from) - stream.in.position(from);
@@ -192,7 +197,8 @@ void Job::planLengths() {
     for (JobStream& stream : streams_) {
         if (stream.type != kAudio) continue;
         if (video)
-            stream.expected = QvUtil::samplesForFrames(static_cast<int>(video->expected), video->rate, stream.samplerate);
+            stream.expected =
+                QvUtil::samplesForFrames(static_cast<int>(video->expected), video->rate, stream.samplerate);
         else
             stream.expected = stream.out.position(stream.samplerate) - stream.in.position(stream.samplerate);
         stream.inUnits = stream.expected;
@@ -217,10 +223,13 @@ void Job::buildPipe() {
         pipe_->applyPreset(QvProfile::aviRaw, 0);
     }
     pipe_->clearStreams();
-    const char* muxer = kind_ == OutputKind::nothing ? "nullmux" : kind_ == OutputKind::avi ? "rawavimux" : "rawmux";
+    const char* muxer = kind_ == OutputKind::nothing ? "nullmux"
+                        : kind_ == OutputKind::avi   ? "rawavimux"
+                                                     : "rawmux";
     if (std::string_view(pipe_->getMuxer() ? pipe_->getMuxer()->name() : "") != muxer &&
         pipe_->setMuxer(muxer) != QvStatus::ok)
-        throw Failure(Exit::module, std::string("the multiplexer ") + muxer + " can't be used: " + pipe_->errorDesc());
+        throw Failure(Exit::module,
+                      std::string("the multiplexer ") + muxer + " can't be used: " + pipe_->errorDesc());
     QvMuxer& m = *pipe_->getMuxer();
     if (kind_ == OutputKind::pictures) {
         m.setParam("splitVideo", 1);
@@ -234,7 +243,8 @@ void Job::addStream(JobStream& stream) {
     const char* module = stream.type == kVideo ? "rawvenc" : "rawaenc";
     if (pipe_->addStream(stream.type, Any(module)) < 0)
         throw Failure(Exit::output, std::string("the output takes no further ") +
-                                        (stream.type == kVideo ? "picture" : "sound") + ": " + pipe_->errorDesc());
+                                        (stream.type == kVideo ? "picture" : "sound") + ": " +
+                                        pipe_->errorDesc());
     QvEncoder& encoder = *pipe_->encoder(stream.type, stream.encStream);
     if (stream.type == kVideo) {
         setChecked(encoder, "type", static_cast<int>(stream.fourcc), "--pixel");
@@ -256,12 +266,15 @@ void Job::applyFilters(ProcessParams& params, int type) const {
         const std::string name = spec.substr(0, colon);
         const QvModule* module = qv_registry()->module(name.c_str());
         const int kind = module ? module->getAttr("type").toInt32() : 0;
-        if (kind != kVideoFilter && kind != kAudioFilter) makeAnyCodec(name, kVideoFilter);  // says what is wrong
+        if (kind != kVideoFilter && kind != kAudioFilter)
+            makeAnyCodec(name, kVideoFilter);  // says what is wrong
         if (kind != (type == kVideo ? kVideoFilter : kAudioFilter)) continue;
         const auto filter = makeAnyCodec(name, kind);
-        const KeyValues keys(colon == std::string::npos ? "" : spec.substr(colon + 1), {}, "--filter " + name);
+        const KeyValues keys(colon == std::string::npos ? "" : spec.substr(colon + 1), {},
+                             "--filter " + name);
         AnyDict stored;
-        for (const auto& [key, value] : keys.all()) setChecked(*filter, key, valueOf(value), "--filter " + name);
+        for (const auto& [key, value] : keys.all())
+            setChecked(*filter, key, valueOf(value), "--filter " + name);
         filter->store(stored);
         stored.set("_on", 1);
         state.appendFilter(name.c_str(), stored);

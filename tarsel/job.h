@@ -40,11 +40,11 @@ struct JobStream {
     unsigned fourcc = 0;
     QvFramerate rate;
     int samplerate = 0, channels = 0, bits = 0;
-    MediaTime in, out;             // in the source
-    long long inUnits = 0;         // frames or samples between the points
-    long long expected = 0;        // frames or samples of the output
-    long long written = -1;        // after the run
-    long long bytes() const;       // of `expected`, without headers
+    MediaTime in, out;        // in the source
+    long long inUnits = 0;    // frames or samples between the points
+    long long expected = 0;   // frames or samples of the output
+    long long written = -1;   // after the run
+    long long bytes() const;  // of `expected`, without headers
 };
 
 class Job {

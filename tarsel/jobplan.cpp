@@ -11,15 +11,16 @@ std::string formatOf(const JobStream& s) {
     if (s.type == 1)
         return std::to_string(s.width) + "x" + std::to_string(s.height) + " " + fourccText(s.fourcc) + " " +
                s.rate.desc(true, true).asString();
-    return std::to_string(s.samplerate) + " Hz, " + std::to_string(s.channels) + " ch, " + std::to_string(s.bits) +
-           " bit";
+    return std::to_string(s.samplerate) + " Hz, " + std::to_string(s.channels) + " ch, " +
+           std::to_string(s.bits) + " bit";
 }
 
 }  // namespace
 
 void Job::printPlan() const {
     for (const auto& source : sources_)
-        std::printf("input   %s  %s\n", inQuotes(source->name()).c_str(), formatTime(source->duration()).c_str());
+        std::printf("input   %s  %s\n", inQuotes(source->name()).c_str(),
+                    formatTime(source->duration()).c_str());
     long long total = 0;
     for (const JobStream& s : streams_) {
         std::printf("stream  %s %d of %s, %s to %s\n", s.type == 1 ? "video" : "audio", s.decStream,
@@ -27,32 +28,12 @@ void Job::printPlan() const {
                     formatTime(s.out.seconds()).c_str());
         for (const auto& filter : options_.filters) std::printf("filter  %s\n", filter.c_str());
         std::printf("encoder %s: %s\n", pipe_->encoder(s.type, s.encStream)->name(), formatOf(s).c_str());
-        std::printf("expect  %lld %s, %lld bytes\n", s.expected, s.type == 1 ? "frames" : "samples", s.bytes());
+        std::printf("expect  %lld %s, %lld bytes\n", s.expected, s.type == 1 ? "frames" : "samples",
+                    s.bytes());
         total += s.bytes();
     }
-    std::printf("output  %s by %s, %s\n", outputs_ ? inQuotes(outputs_->output().string()).c_str() : "nothing",
+    std::printf("output  %s by %s, %s\n",
+                outputs_ ? inQuotes(outputs_->output().string()).c_str() : "nothing",
                 pipe_->getMuxer()->name(), formatBytes(total).c_str());
     for (const auto& warning : warnings_) std::fprintf(stderr, "tarsel: warning: %s\n", warning.c_str());
-}
-
-void Job::saveTask() const {
-    QvTask task;
-    task.setEncoder(pipe_.get());
-    for (const JobStream& s : streams_) {
-        ProcessParams params;
-        params.setInOutPoints(InOutPoints(s.in, s.out));
-        applyFilters(params, s.type);
-        if (task.link(&s.source->decoder(), s.type, s.decStream, s.encStream, params) < 0)
-            throw Failure(Exit::failed, task.errorDesc());
-    }
-    if (outputs_) pipe_->setFilename(Any(outputs_->output().c_str()));
-    AnyDict state;
-    task.store(state);
-    try {
-        if (XmlParser::storeDict(Any(options_.saveTask.c_str()), state, "TranscodeTask", Any("2.0")) == QvStatus::ok)
-            return;
-    } catch (const QvFileException& error) {
-        throw Failure(Exit::output, error.what());
-    }
-    throw Failure(Exit::output, "can't write the task file " + inQuotes(options_.saveTask));
 }

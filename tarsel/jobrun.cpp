@@ -26,7 +26,8 @@ class Job::Runner : public QvTranscoder {
     // The counts have to be taken before the links close.
     int cbMuxClose(QvMuxer*) override {
         for (JobStream& stream : job_.streams_)
-            if (TransLink* link = getLinkForOutput(stream.type, stream.encStream)) stream.written = link->outProcessed();
+            if (TransLink* link = getLinkForOutput(stream.type, stream.encStream))
+                stream.written = link->outProcessed();
         last_ = state("closing");
         return 0;
     }
@@ -62,7 +63,8 @@ class Job::Runner : public QvTranscoder {
             const long long units = std::max(link->outProcessed(), 0LL);
             if (stream.expected > 0)
                 s.part = std::min(1.0, static_cast<double>(units) / static_cast<double>(stream.expected));
-            const double rate = stream.type == 1 ? static_cast<double>(stream.rate.rate()) : stream.samplerate;
+            const double rate =
+                stream.type == 1 ? static_cast<double>(stream.rate.rate()) : stream.samplerate;
             s.outSeconds = static_cast<double>(units) / rate;
             if (stream.type == 1) s.frame = units;
             break;
@@ -137,19 +139,22 @@ void Job::run() {
     for (const auto& warning : warnings_) std::fprintf(stderr, "tarsel: warning: %s\n", warning.c_str());
     if (options_.quiet) return;
     std::string where = names.empty() ? "nothing" : inQuotes(names.front());
-    if (names.size() > 1) where += names.size() == 2 ? " and " + inQuotes(names[1])
-                                                     : " and " + std::to_string(names.size() - 1) + " more files";
+    if (names.size() > 1)
+        where += names.size() == 2 ? " and " + inQuotes(names[1])
+                                   : " and " + std::to_string(names.size() - 1) + " more files";
     std::fprintf(stderr, "tarsel: wrote %s", where.c_str());
     for (const JobStream& s : streams_)
         std::fprintf(stderr, ", %lld %s", s.written, s.type == 1 ? "frames" : "samples");
-    std::fprintf(stderr, "%s\n", warnings_.empty() ? "" : (" (" + std::to_string(warnings_.size()) + " warnings)").c_str());
+    std::fprintf(stderr, "%s\n",
+                 warnings_.empty() ? "" : (" (" + std::to_string(warnings_.size()) + " warnings)").c_str());
 }
 
 // The reason stands in the object that failed: a decoder, or one of the output's members.
 void Job::fail(Runner& runner) const {
     for (const auto& source : sources_)
         if (source->decoder().errorCode() < 0 && source->decoder().errorCode() != QvStatus::endOfStream)
-            throw Failure(Exit::input, "can't read " + inQuotes(source->name()) + ": " + source->decoder().errorDesc());
+            throw Failure(Exit::input,
+                          "can't read " + inQuotes(source->name()) + ": " + source->decoder().errorDesc());
     std::string reason;
     const auto take = [&](const QvCodec* codec) {
         if (reason.empty() && codec && codec->errorCode() != 0) reason = codec->errorDesc();
@@ -157,7 +162,8 @@ void Job::fail(Runner& runner) const {
     AnyVector messages;
     qv_log()->getAll(messages);
     for (int i = 0; i < messages.size() && reason.empty(); ++i)
-        if (messages.at(i).asDict().getInt32("type", 0) == 2) reason = messages.at(i).asDict().getString("text", "");
+        if (messages.at(i).asDict().getInt32("type", 0) == 2)
+            reason = messages.at(i).asDict().getString("text", "");
     take(pipe_->getMuxer());
     take(pipe_->sink());
     for (const JobStream& s : streams_) take(pipe_->encoder(s.type, s.encStream));
@@ -172,8 +178,8 @@ void Job::checkResult(const std::vector<std::string>&) const {
     for (const JobStream& s : streams_) {
         if (s.written >= s.expected) continue;
         const char* unit = s.type == 1 ? "frames" : "samples";
-        const std::string line = inQuotes(s.source->name()) + " ended early: " + std::to_string(s.written) + " of " +
-                                 std::to_string(s.expected) + " " + unit + " were read";
+        const std::string line = inQuotes(s.source->name()) + " ended early: " + std::to_string(s.written) +
+                                 " of " + std::to_string(s.expected) + " " + unit + " were read";
         if (!options_.acceptPartial)
             throw Failure(Exit::input, line + "; --accept-partial keeps what is there");
         warnings_.push_back(line);
@@ -182,10 +188,12 @@ void Job::checkResult(const std::vector<std::string>&) const {
     if (!outputs_ || kind_ != OutputKind::raw || first->type != 1) return;
     std::error_code error;
     const Any name = pipe_->getMuxer()->QvCodec::getParam("filenames");
-    if (!name.isVector() || name.asVector().empty() || !fs::is_regular_file(name.asVector().at(0).asString(), error)) return;
+    if (!name.isVector() || name.asVector().empty() ||
+        !fs::is_regular_file(name.asVector().at(0).asString(), error))
+        return;
     const auto bytes = static_cast<long long>(fs::file_size(name.asVector().at(0).asString(), error));
     const long long wanted = first->expected > 0 ? first->bytes() / first->expected * first->written : 0;
     if (bytes != wanted)
-        throw Failure(Exit::check, inQuotes(options_.output) + " has " + std::to_string(bytes) + " bytes instead of " +
-                                       std::to_string(wanted));
+        throw Failure(Exit::check, inQuotes(options_.output) + " has " + std::to_string(bytes) +
+                                       " bytes instead of " + std::to_string(wanted));
 }

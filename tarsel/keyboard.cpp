@@ -21,7 +21,8 @@ struct Keyboard::Terminal {
     bool open() {
         device = ::open("/dev/tty", O_RDONLY | O_CLOEXEC | O_NOCTTY);
         if (device < 0) return false;
-        if (tcgetpgrp(device) != getpgrp() || tcgetattr(device, &former) != 0 || pipe2(wake, O_CLOEXEC) != 0) {
+        if (tcgetpgrp(device) != getpgrp() || tcgetattr(device, &former) != 0 ||
+            pipe2(wake, O_CLOEXEC) != 0) {
             close(device);
             device = -1;
             return false;

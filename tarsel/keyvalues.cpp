@@ -11,11 +11,12 @@ KeyValues::KeyValues(std::string_view text, const std::vector<std::string>& know
         text = comma == std::string_view::npos ? std::string_view() : text.substr(comma + 1);
         const size_t equals = pair.find('=');
         if (equals == std::string_view::npos || equals == 0)
-            throw Failure(Exit::usage, std::string(option) + ": " + inQuotes(pair) + " is not of the form key=value");
+            throw Failure(Exit::usage,
+                          std::string(option) + ": " + inQuotes(pair) + " is not of the form key=value");
         const std::string key(pair.substr(0, equals));
         if (!known.empty() && std::find(known.begin(), known.end(), key) == known.end())
-            throw Failure(Exit::usage,
-                          std::string(option) + ": unknown key " + inQuotes(key) + "." + suggestion(key, known));
+            throw Failure(Exit::usage, std::string(option) + ": unknown key " + inQuotes(key) + "." +
+                                           suggestion(key, known));
         pairs_.emplace_back(key, pair.substr(equals + 1));
     }
 }

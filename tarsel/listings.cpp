@@ -125,20 +125,23 @@ void add(CLI::App& app, Action& chosen, const char* name, const char* help, Json
 }  // namespace
 
 void addModules(CLI::App& app, Action& chosen) {
-    add(app, chosen, "modules", "List the modules of the library and its plug-ins", modules, [](const Json& list) {
-        for (const auto& m : list)
-            std::printf("%-13s %-14s %s%s\n", m["name"].get<std::string>().c_str(),
-                        m["kind"].get<std::string>().c_str(), m["description"].get<std::string>().c_str(),
-                        m["usable"].get<bool>() ? "" : "  (not usable)");
-    });
+    add(app, chosen, "modules", "List the modules of the library and its plug-ins", modules,
+        [](const Json& list) {
+            for (const auto& m : list)
+                std::printf("%-13s %-14s %s%s\n", m["name"].get<std::string>().c_str(),
+                            m["kind"].get<std::string>().c_str(), m["description"].get<std::string>().c_str(),
+                            m["usable"].get<bool>() ? "" : "  (not usable)");
+        });
 }
 
 void addPresets(CLI::App& app, Action& chosen) {
-    add(app, chosen, "presets", "List the presets that the installed modules allow", presets, [](const Json& list) {
-        for (const auto& p : list)
-            std::printf("%-24s video %s; audio %s; %s\n", p["name"].get<std::string>().c_str(),
-                        joined(p["video"]).c_str(), joined(p["audio"]).c_str(), joined(p["muxers"]).c_str());
-    });
+    add(app, chosen, "presets", "List the presets that the installed modules allow", presets,
+        [](const Json& list) {
+            for (const auto& p : list)
+                std::printf("%-24s video %s; audio %s; %s\n", p["name"].get<std::string>().c_str(),
+                            joined(p["video"]).c_str(), joined(p["audio"]).c_str(),
+                            joined(p["muxers"]).c_str());
+        });
 }
 
 void addFormats(CLI::App& app, Action& chosen) {

@@ -5,8 +5,8 @@
 #include <memory>
 #include <new>
 
-#include <CLI/CLI.hpp>
 #include <qvplugcore/qvplugcore.h>
+#include <CLI/CLI.hpp>
 
 #include "commands.h"
 #include "failure.h"
@@ -53,7 +53,8 @@ int wrongUse(const CLI::App& app, const CLI::ParseError& error, int argc, char**
         for (const auto& name : option->get_lnames()) known.push_back("--" + name);
     for (int i = 1; i < argc; ++i) {
         const std::string word = std::string(argv[i]).substr(0, std::string(argv[i]).find('='));
-        if (line.find(word) != std::string::npos && std::find(known.begin(), known.end(), word) == known.end())
+        if (line.find(word) != std::string::npos &&
+            std::find(known.begin(), known.end(), word) == known.end())
             line += suggestion(word, known);
     }
     const std::string help = used == &app ? "tarsel --help" : "tarsel " + used->get_name() + " --help";
@@ -70,7 +71,9 @@ int main(int argc, char** argv) {
     app.set_version_flag("--version", std::string("tarsel ") + QvUtil::libraryVersion().asString());
     std::string log, plugins;
     app.add_option("--log", log, "Write the engine's log to FILE, or to stderr")->type_name("FILE");
-    app.add_option("--plugins", plugins, "Load the plug-ins of FOLDER")->type_name("FOLDER")->envname("TARSEL_PLUGINS");
+    app.add_option("--plugins", plugins, "Load the plug-ins of FOLDER")
+        ->type_name("FOLDER")
+        ->envname("TARSEL_PLUGINS");
     Action chosen;
     addTranscode(app, chosen, signals);
     addInfo(app, chosen);
@@ -88,7 +91,8 @@ int main(int argc, char** argv) {
     try {
         Engine engine(log, plugins);
         chosen();
-        if (std::fflush(stdout) != 0 || std::ferror(stdout)) return say(Exit::output, "can't write to the standard output");
+        if (std::fflush(stdout) != 0 || std::ferror(stdout))
+            return say(Exit::output, "can't write to the standard output");
         return status(Exit::done);
     } catch (const Failure& failure) {
         return say(failure.exit(), failure.what());

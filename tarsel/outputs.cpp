@@ -14,7 +14,9 @@ namespace fs = std::filesystem;
 
 namespace {
 
-fs::path folderOf(const fs::path& name) { return name.has_parent_path() ? name.parent_path() : fs::path("."); }
+fs::path folderOf(const fs::path& name) {
+    return name.has_parent_path() ? name.parent_path() : fs::path(".");
+}
 
 [[noreturn]] void refuse(const fs::path& name, const std::string& why) {
     throw Failure(Exit::output, "can't write " + inQuotes(name.string()) + ": " + why);

@@ -4,8 +4,8 @@
 #include <cstdio>
 #include <cstdlib>
 
-#include <nlohmann/json.hpp>
 #include <unistd.h>
+#include <nlohmann/json.hpp>
 
 #include "timespec.h"
 
@@ -15,7 +15,8 @@ constexpr auto kLineInterval = std::chrono::milliseconds(100);
 constexpr auto kJsonInterval = std::chrono::milliseconds(500);
 
 nlohmann::ordered_json orNull(double value) {
-    return std::isfinite(value) && value >= 0 ? nlohmann::ordered_json(value) : nlohmann::ordered_json(nullptr);
+    return std::isfinite(value) && value >= 0 ? nlohmann::ordered_json(value)
+                                              : nlohmann::ordered_json(nullptr);
 }
 
 double round1(double value) { return std::round(value * 10) / 10; }
@@ -75,7 +76,8 @@ void Progress::showLine(const ProgressState& state, double elapsed, double eta) 
     }
     std::snprintf(part, sizeof part, "  frame %lld  %.1fx", state.frame, speed);
     text += part;
-    if (eta >= 0) text += "  left " + formatTime(std::ceil(eta)).substr(0, formatTime(std::ceil(eta)).size() - 4);
+    if (eta >= 0)
+        text += "  left " + formatTime(std::ceil(eta)).substr(0, formatTime(std::ceil(eta)).size() - 4);
     if (std::string_view(state.state) == "paused") text += "  paused (p resumes)";
     std::fprintf(stderr, "\r%s\x1b[K", text.c_str());
     std::fflush(stderr);

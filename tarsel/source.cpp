@@ -49,7 +49,8 @@ std::unique_ptr<QvCodec> makeAnyCodec(const std::string& module, int kind) {
     const QvModule* found = qv_registry()->module(module.c_str());
     if (!found || found->getAttr("type").toInt32() != kind)
         throw Failure(Exit::module, "there is no module " + inQuotes(module) + " of this kind." +
-                                        suggestion(module, moduleNames(kind)) + " 'tarsel modules' lists all");
+                                        suggestion(module, moduleNames(kind)) +
+                                        " 'tarsel modules' lists all");
     std::unique_ptr<QvCodec> codec(qv_registry()->newCodec(module.c_str()));
     if (!codec)
         throw Failure(Exit::module, "the module " + inQuotes(module) + " can't be used in this installation");
@@ -70,7 +71,8 @@ void setChecked(QvCodec& codec, const std::string& name, const Any& value, const
 Source::Source(const std::string& spec, const std::string& raw) : name_(spec) {
     if (spec.rfind(kGenerator, 0) == 0 || spec == "testgen") {
         isFile_ = false;
-        if (!raw.empty()) throw Failure(Exit::usage, "--raw describes a file; " + inQuotes(spec) + " is none");
+        if (!raw.empty())
+            throw Failure(Exit::usage, "--raw describes a file; " + inQuotes(spec) + " is none");
         openGenerator(spec);
         return;
     }
@@ -186,7 +188,8 @@ void Source::openFile() {
         for (int i = 0; i < exts->size(); ++i) known.push_back(exts->at(i).asString());
         if (std::find(known.begin(), known.end(), ext.asString()) != known.end())
             refuse("a raw file has no header; give its format with --raw size=WxH,pixel=FORMAT,rate=R");
-        refuse("no decoder for the extension " + inQuotes(ext.asString()) + "; 'tarsel formats' lists what opens");
+        refuse("no decoder for the extension " + inQuotes(ext.asString()) +
+               "; 'tarsel formats' lists what opens");
     }
     refuse(log.lastFailure.empty() ? "no decoder can read it" : log.lastFailure);
 }

@@ -13,7 +13,8 @@ constexpr long long kTicks = 35280000;              // a second of MediaTime
 constexpr long long kLongest = 1000LL * 3600 * 24;  // seconds; a bound, not a wish
 
 [[noreturn]] void refuse(std::string_view option, std::string_view text, std::string_view wanted) {
-    throw Failure(Exit::usage, std::string(option) + ": " + inQuotes(text) + " is not " + std::string(wanted));
+    throw Failure(Exit::usage,
+                  std::string(option) + ": " + inQuotes(text) + " is not " + std::string(wanted));
 }
 
 std::optional<long long> number(std::string_view text) {
@@ -85,7 +86,8 @@ MediaTime parseTime(std::string_view text, const std::optional<QvFramerate>& rat
     if (parts.size() == 4) {
         for (size_t i = 0; i < 4; ++i) {
             const auto value = number(parts[i]);
-            if (!value || *value < 0 || *value > (i == 0 ? 99 : i == 3 ? 999 : 59)) refuse(option, text, wanted);
+            if (!value || *value < 0 || *value > (i == 0 ? 99 : i == 3 ? 999 : 59))
+                refuse(option, text, wanted);
         }
         QvFramerate counting = needRate();
         const QvTimecode code{std::string(text).c_str()};
@@ -109,7 +111,8 @@ QvFramerate parseRate(std::string_view text, std::string_view option) {
     }
     if (const auto parts = split(digits, "/"); parts.size() == 2) {
         const auto num = number(parts[0]), den = number(parts[1]);
-        if (!num || !den || *num < 1 || *den < 1 || *num > 100000000 || *den > 1000000) refuse(option, text, wanted);
+        if (!num || !den || *num < 1 || *den < 1 || *num > 100000000 || *den > 1000000)
+            refuse(option, text, wanted);
         return QvFramerate(QvRatio(static_cast<int>(*num), static_cast<int>(*den)), interlaced);
     }
     double value = 0;
@@ -155,8 +158,8 @@ std::string formatTime(double seconds) {
     if (!(seconds >= 0)) return "unknown";
     const long long ms = std::llround(seconds * 1000);
     char text[48];
-    std::snprintf(text, sizeof text, "%lld:%02lld:%02lld.%03lld", ms / 3600000, ms / 60000 % 60, ms / 1000 % 60,
-                  ms % 1000);
+    std::snprintf(text, sizeof text, "%lld:%02lld:%02lld.%03lld", ms / 3600000, ms / 60000 % 60,
+                  ms / 1000 % 60, ms % 1000);
     return text;
 }
 

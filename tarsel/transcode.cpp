@@ -17,10 +17,12 @@ void resolve(Given& given) {
     if (!given.pixel.empty()) job.pixel = parseFourcc(given.pixel, "--pixel");
     if (!given.samplerate.empty())
         job.samplerate = static_cast<int>(parseNumber(given.samplerate, 1000, 768000, "--samplerate"));
-    if (!given.channels.empty()) job.channels = static_cast<int>(parseNumber(given.channels, 1, 8, "--channels"));
+    if (!given.channels.empty())
+        job.channels = static_cast<int>(parseNumber(given.channels, 1, 8, "--channels"));
     if (!given.bits.empty()) job.bits = static_cast<int>(parseNumber(given.bits, 8, 24, "--bits"));
     if (!job.muxer.empty() && job.muxer != "nullmux" && job.muxer != "rawmux" && job.muxer != "rawavimux")
-        throw Failure(Exit::module, "--muxer: there is no multiplexer " + inQuotes(job.muxer) + " for this tool." +
+        throw Failure(Exit::module, "--muxer: there is no multiplexer " + inQuotes(job.muxer) +
+                                        " for this tool." +
                                         suggestion(job.muxer, {"rawmux", "rawavimux", "nullmux"}));
     if (given.progress == "json") job.progress = ProgressMode::json;
     if (given.progress == "none") job.progress = ProgressMode::off;
@@ -40,10 +42,14 @@ void addTranscode(CLI::App& app, Action& chosen, Signals& signals) {
     CLI::App* command = app.add_subcommand("transcode", "Read INPUTs, convert, and write OUTPUT");
     auto given = std::make_shared<Given>();
     JobOptions& job = given->job;
-    command->add_option("INPUT", job.inputs, "Files, or testgen:size=1280x720,rate=25,duration=10")->required();
-    command->add_option("-o,--output", job.output, "What to write; the extension says how")->type_name("FILE");
-    command->add_option("--raw", job.raw, "Format of a raw input: size=WxH,pixel=FORMAT,rate=R")->type_name("K=V,...");
-    command->add_option("--from", job.from, "First instant taken: SS.mmm, HH:MM:SS, 120f, HH:MM:SS:FF")->type_name("TIME");
+    command->add_option("INPUT", job.inputs, "Files, or testgen:size=1280x720,rate=25,duration=10")
+        ->required();
+    command->add_option("-o,--output", job.output, "What to write; the extension says how")
+        ->type_name("FILE");
+    command->add_option("--raw", job.raw, "Format of a raw input: size=WxH,pixel=FORMAT,rate=R")
+        ->type_name("K=V,...");
+    command->add_option("--from", job.from, "First instant taken: SS.mmm, HH:MM:SS, 120f, HH:MM:SS:FF")
+        ->type_name("TIME");
     command->add_option("--to", job.to, "First instant not taken")->type_name("TIME");
     command->add_option("--size", given->size, "Size of the picture")->type_name("WxH");
     command->add_option("--rate", given->rate, "Frames a second: 25, 30000/1001, 25i")->type_name("RATE");
@@ -61,5 +67,6 @@ void addTranscode(CLI::App& app, Action& chosen, Signals& signals) {
     command->add_flag("--dry-run", job.dryRun, "Print the plan and do nothing");
     command->add_flag("-y,--overwrite", job.overwrite, "Overwrite existing outputs");
     command->add_flag("-q,--quiet", job.quiet, "Say nothing but errors");
-    command->callback([&chosen, &signals, given] { chosen = [&signals, given] { transcode(*given, signals); }; });
+    command->callback(
+        [&chosen, &signals, given] { chosen = [&signals, given] { transcode(*given, signals); }; });
 }
