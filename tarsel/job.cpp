@@ -121,6 +121,7 @@ void Job::planStreams() {
     for (const auto& source : sources_)
         for (int type : {kVideo, kAudio}) {
             if (type == kVideo && kind_ == OutputKind::wav) continue;
+            if (outputs_ && outputs_->isDevice() && !streams_.empty()) continue;
             for (int i = 0; i < source->decoder().nrStreams(type); ++i) planStream(*source, type, i);
         }
     if (!streams_.empty()) return;
@@ -210,7 +211,7 @@ std::string Job::primaryExtension() const {
         case OutputKind::wav: return "wav";
         case OutputKind::avi: return "avi";
         case OutputKind::pictures: return "png";
-        default: return "raw";
+        default: return hasVideo() ? "raw" : "wav";
     }
 }
 

@@ -169,6 +169,7 @@ void Job::fail(Runner& runner) const {
     for (const JobStream& s : streams_) take(pipe_->encoder(s.type, s.encStream));
     take(pipe_.get());
     if (reason.empty()) throw Failure(Exit::failed, runner.errorDesc());
+    if (outputs_) reason = outputs_->withFinalNames(reason);
     throw Failure(Exit::output,
                   (outputs_ ? "can't write " + inQuotes(outputs_->output().string()) + ": " : "") + reason);
 }

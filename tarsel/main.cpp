@@ -1,4 +1,5 @@
 // tarsel: the command-line tool of the engine.
+#include <algorithm>
 #include <clocale>
 #include <cstdio>
 #include <cstdlib>
@@ -61,6 +62,20 @@ int wrongUse(const CLI::App& app, const CLI::ParseError& error, int argc, char**
     return say(Exit::usage, line + " See '" + help + "'");
 }
 
+// The parser takes a mistyped command for a missing one.
+void checkCommand(const CLI::App& app, int argc, char** argv) {
+    const std::vector<std::string> known = subcommandNames(app);
+    for (int i = 1; i < argc; ++i) {
+        const std::string word = argv[i];
+        if (word == "--log" || word == "--plugins") ++i;
+        if (word.empty() || word[0] == '-') continue;
+        if (std::find(known.begin(), known.end(), word) == known.end())
+            throw Failure(Exit::usage, "there is no command " + inQuotes(word) + "." +
+                                           suggestion(word, known) + " 'tarsel --help' lists all");
+        return;
+    }
+}
+
 }  // namespace
 
 int main(int argc, char** argv) {
@@ -82,11 +97,14 @@ int main(int argc, char** argv) {
     addFormats(app, chosen);
     addPresets(app, chosen);
     try {
+        checkCommand(app, argc, argv);
         app.parse(argc, argv);
     } catch (const CLI::Success& shown) {
         return app.exit(shown);
     } catch (const CLI::ParseError& error) {
         return wrongUse(app, error, argc, argv);
+    } catch (const Failure& failure) {
+        return say(failure.exit(), failure.what());
     }
     try {
         Engine engine(log, plugins);

@@ -70,6 +70,15 @@ bool Outputs::isDevice() const {
     return fs::exists(status) && !fs::is_regular_file(status);
 }
 
+std::string Outputs::withFinalNames(std::string text) const {
+    const std::string hidden = folder_.string() + "/";
+    const std::string shown = output_.has_parent_path() ? output_.parent_path().string() + "/" : "";
+    for (size_t at = 0; !folder_.empty() && (at = text.find(hidden, at)) != std::string::npos;
+         at += shown.size())
+        text.replace(at, hidden.size(), shown);
+    return text;
+}
+
 std::string Outputs::begin(const std::string& extension) {
     // What is written to a device or a pipe goes straight there, by a link in a folder elsewhere.
     const fs::path where = isDevice() ? fs::temp_directory_path() : folderOf(output_);

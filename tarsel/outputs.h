@@ -28,12 +28,14 @@ class Outputs {
     // Removes what was written. Safe to call at any time, from any thread, more than once.
     void discard();
 
+    // True when `output` is a device or a pipe, which takes exactly one stream.
+    bool isDevice() const;
+    // A message of the engine with the final names in it in place of those in the hidden folder.
+    std::string withFinalNames(std::string text) const;
     const std::filesystem::path& output() const { return output_; }
     std::string finalName(const std::filesystem::path& written, const std::string& from) const;
 
   private:
-    bool isDevice() const;
-
     std::filesystem::path output_, folder_;
     std::vector<std::string> inputs_;
     bool overwrite_;

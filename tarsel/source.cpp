@@ -14,15 +14,6 @@ namespace {
 constexpr int kDecoder = 2;
 constexpr const char* kGenerator = "testgen:";
 
-// Collects what the factory says while it tries decoders.
-struct OpenLog : QvFileOpenCb {
-    int fileOpenFinished(int result, QvFileOpenCbData& data) override {
-        if (result != 0 && data.text.isString()) lastFailure = data.text.asString();
-        return 0;
-    }
-    std::string lastFailure;
-};
-
 std::vector<std::string> moduleNames(int kind) {
     std::vector<std::string> names;
     const AnyVector modules = qv_registry()->modules(kind);
@@ -176,10 +167,18 @@ void Source::openRaw(const std::string& raw) {
     if (d.nrFrames(0) == 0) refuse("the file is shorter than one frame of " + *size + " " + *pixel);
 }
 
+// Why the best decoder refuses the file. The factory keeps only its name, so it is asked once more.
+std::string Source::reasonOf(const AnyVector& decoders) const {
+    std::unique_ptr<QvCodec> codec(qv_registry()->newCodec(decoders.at(0).asString()));
+    if (!codec) return std::string("the decoder ") + decoders.at(0).asString() + " can't be used";
+    codec->setParam("filename", name_.c_str());
+    if (codec->open() == QvStatus::ok || !*codec->errorDesc()) return "no decoder can read it";
+    return codec->errorDesc();
+}
+
 void Source::openFile() {
     const Any ext = QvFile::getExt(Any(name_.c_str()), true);
-    OpenLog log;
-    decoder_.reset(QvDecFactory::decodePipe(Any(name_.c_str()), Any(), &log, nullptr));
+    decoder_.reset(QvDecFactory::decodePipe(Any(name_.c_str())));
     if (decoder_) return;
     const AnyVector candidates = qv_registry()->decoders(ext.asString());
     const std::unique_ptr<AnyVector> exts(qv_registry()->inputExts(false, false));
@@ -191,7 +190,7 @@ void Source::openFile() {
         refuse("no decoder for the extension " + inQuotes(ext.asString()) +
                "; 'tarsel formats' lists what opens");
     }
-    refuse(log.lastFailure.empty() ? "no decoder can read it" : log.lastFailure);
+    refuse(reasonOf(candidates));
 }
 
 std::optional<QvFramerate> Source::frameRate() const {

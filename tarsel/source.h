@@ -32,6 +32,7 @@ class Source {
     void openGenerator(const std::string& spec);
     void openRaw(const std::string& raw);
     void openFile();
+    std::string reasonOf(const AnyVector& decoders) const;
     [[noreturn]] void refuse(const std::string& why) const;
 
     std::string name_;
