@@ -1,35 +1,58 @@
-// Feeds files to the PNG reader, with and without an alpha frame. The signature is supplied.
+// Feeds chunks to the PNG reader, with and without an alpha frame. Signature and checksums are supplied, so
+// that inputs get past them.
+#include <unistd.h>
+#include <zlib.h>
+
 #include <cstdint>
 #include <cstdio>
 #include <memory>
-
-#include <unistd.h>
+#include <vector>
 
 #include "core/media/pngfile_p.h"
 #include "core/media/qvframe.h"
 
 namespace {
 
-// What a reader may spend on one input; larger pictures are claims of the header only.
-constexpr int maxBytes = 64 << 20;
+using Bytes = std::vector<unsigned char>;
+
+// What a reader may spend on one input; larger pictures only cost time.
+constexpr long long maxPixels = 4 << 20;
+
+std::size_t numberAt(const Bytes& bytes, std::size_t at) {
+    return static_cast<std::size_t>(bytes[at]) << 24 | static_cast<std::size_t>(bytes[at + 1]) << 16 |
+           static_cast<std::size_t>(bytes[at + 2]) << 8 | bytes[at + 3];
+}
+
+// Chunks are length, name, data and checksum; each but the data takes four bytes.
+void mendChecksums(Bytes& file) {
+    for (std::size_t at = 8; at + 12 <= file.size();) {
+        const std::size_t length = numberAt(file, at);
+        if (length > file.size() - at - 12) return;
+        const auto sum = crc32(0, file.data() + at + 4, static_cast<uInt>(length + 4));
+        for (std::size_t i = 0; i < 4; ++i)
+            file[at + 8 + length + i] = static_cast<unsigned char>(sum >> (24 - 8 * i));
+        at += 12 + length;
+    }
+}
+
+bool replaceContents(std::FILE* file, const Bytes& bytes) {
+    std::rewind(file);
+    return std::fwrite(bytes.data(), 1, bytes.size(), file) == bytes.size() && std::fflush(file) == 0 &&
+           ftruncate(fileno(file), static_cast<off_t>(bytes.size())) == 0;
+}
 
 }  // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
-    static constexpr unsigned char signature[] = {0x89, 'P', 'N', 'G', '\r', '\n', 0x1a, '\n'};
     static const std::unique_ptr<std::FILE, int (*)(std::FILE*)> file(std::tmpfile(), std::fclose);
-    if (!file || size < 17) return 0;
-    const auto side = [&](std::size_t at) {
-        return data[at] << 24 | data[at + 1] << 16 | data[at + 2] << 8 | data[at + 3];
-    };
-    const long long width = side(8), height = side(12);
-    if (width < 0 || height < 0 || width * height > maxBytes / 4) return 0;
-    std::rewind(file.get());
-    if (std::fwrite(signature, 1, sizeof(signature), file.get()) != sizeof(signature) ||
-        std::fwrite(data, 1, size, file.get()) != size)
-        return 0;
-    std::fflush(file.get());
-    if (ftruncate(fileno(file.get()), static_cast<off_t>(sizeof(signature) + size)) != 0) return 0;
+    if (!file || size < 25) return 0;
+    Bytes bytes = {0x89, 'P', 'N', 'G', '\r', '\n', 0x1a, '\n'};
+    bytes.insert(bytes.end(), data, data + size);
+    const auto width = static_cast<double>(numberAt(bytes, 16)),
+               height = static_cast<double>(numberAt(bytes, 20));
+    if (width * height > static_cast<double>(maxPixels)) return 0;
+    mendChecksums(bytes);
+    if (!replaceContents(file.get(), bytes)) return 0;
     for (const bool withAlpha : {false, true}) {
         QvFrame picture, alpha;
         std::rewind(file.get());
