@@ -14,6 +14,12 @@
 #include "core/stream/wavheader_p.h"
 #include "core/value/qvassert.h"
 
+namespace {
+
+constexpr size_t fileBufferBytes = 1 << 16;  // several access units, which are small
+
+}  // namespace
+
 struct QvBsSplitAudio::Wav {
     struct File {
         StdFile file;
@@ -104,6 +110,7 @@ bool QvBsSplitAudio::openFile(const Any& name) {
         qv_log()->error("[split writer] Failed to open %s.", narrow.c_str());
         return false;
     }
+    entry.file.setBuffer(fileBufferBytes);
     if (entry.file.write(room, sizeof room) && entry.file.flush()) return true;
     failure()->note(entry.file.error(), "Failed to write to", entry.name);
     qv_log()->error("[split writer] Failed to write to %s.", narrow.c_str());

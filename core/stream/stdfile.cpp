@@ -17,6 +17,10 @@ bool StdFile::open(const QvWideString& name, const char* mode) {
     return check(file_ != nullptr);
 }
 
+void StdFile::setBuffer(size_t bytes) {
+    if (file_) std::setvbuf(file_, nullptr, _IOFBF, bytes);
+}
+
 size_t StdFile::writeSome(const void* data, size_t bytes) {
     errno = 0;
     const size_t done = file_ ? std::fwrite(data, 1, bytes, file_) : 0;
