@@ -20,6 +20,7 @@ int BufMemOut::init() {
 
 unsigned char* BufMemOut::request(unsigned n) {
     QV_ASSERT_MSG(n > 0, "numSamples > 0");
+    ring_->rewindIfEmpty();
     unsigned char* block = ring_->requestWrite(n);
     qv_dbg()->debug("%p fifow_request numSamples=%u, ret=%p, empty=%u", static_cast<void*>(this), n,
                     static_cast<void*>(block), ring_->room());
@@ -35,6 +36,7 @@ unsigned BufMemOut::confirm(unsigned n) {
 
 unsigned BufMemOut::copybytes(unsigned char* p, unsigned n) {
     QV_ASSERT_MSG(n > 0 && n <= ring_->start, "numSamples > 0 && numSamples <= _fifo->sampchunk");
+    ring_->rewindIfEmpty();
     const unsigned done = ring_->copyIn(p, n);
     qv_dbg()->debug("%p fifow_copybytes numSamples=%u, ret=%u, empty=%u", static_cast<void*>(this), n, done,
                     ring_->room());

@@ -33,6 +33,12 @@ struct bytefifo {
     }
     unsigned data() const { return write >= read ? write - read : end - start - read + write; }
 
+    // Where writer and reader are one thread, the writer goes back to the start of a ring that has been
+    // drained: the same memory stays in the cache, and nothing has to be moved over the end.
+    void rewindIfEmpty() {
+        if (read == write) read = write = start;
+    }
+
     unsigned char* requestWrite(unsigned n);
     // More than the room of the block is cut to it; without a block nothing is committed.
     unsigned confirmWrite(unsigned n);

@@ -16,14 +16,50 @@
 
 namespace {
 
-constexpr size_t fileBufferBytes = 1 << 16;  // several access units, which are small
+constexpr size_t smallItem = 4096;
+constexpr size_t gatheredBytes = 1 << 16;
+
+// A file of samples. Items of some size go to the system without a copy, small ones are gathered first.
+class SampleFile {
+  public:
+    bool open(const QvWideString& name) {
+        name_ = name;
+        if (!file_.open(name, "wb")) return false;
+        file_.setUnbuffered();
+        return true;
+    }
+    bool write(const unsigned char* data, size_t bytes) {
+        if (bytes >= smallItem || gathered_.size() + bytes > gatheredBytes) {
+            if (!flush()) return false;
+            if (bytes >= smallItem) return file_.write(data, bytes);
+        }
+        gathered_.insert(gathered_.end(), data, data + bytes);
+        return file_.isOpen();
+    }
+    bool flush() {
+        const bool ok = gathered_.empty() || file_.write(gathered_.data(), gathered_.size());
+        gathered_.clear();
+        return ok;
+    }
+    bool close() {
+        if (!file_.isOpen()) return true;
+        const bool flushed = flush();
+        return file_.close() && flushed;
+    }
+    const QvWideString& name() const { return name_; }
+    int error() const { return file_.error(); }
+
+  private:
+    StdFile file_;
+    QvWideString name_;
+    std::vector<unsigned char> gathered_;
+};
 
 }  // namespace
 
 struct QvBsSplitAudio::Wav {
     struct File {
-        StdFile file;
-        QvWideString name;
+        SampleFile file;
         QvPcm samples;  // of its channel; in split mode only
     };
 
@@ -104,15 +140,13 @@ bool QvBsSplitAudio::openFile(const Any& name) {
     static constexpr unsigned char room[wavHeaderBytes] = {};
     const std::string narrow = qv_os_name(name);
     auto& entry = *wav_->files.emplace_back(std::make_unique<Wav::File>());
-    entry.name = qv_wide_name(narrow);
-    if (!entry.file.open(entry.name, "wb")) {
-        failure()->note(entry.file.error(), "Can not open file", entry.name);
+    if (!entry.file.open(qv_wide_name(narrow))) {
+        failure()->note(entry.file.error(), "Can not open file", entry.file.name());
         qv_log()->error("[split writer] Failed to open %s.", narrow.c_str());
         return false;
     }
-    entry.file.setBuffer(fileBufferBytes);
     if (entry.file.write(room, sizeof room) && entry.file.flush()) return true;
-    failure()->note(entry.file.error(), "Failed to write to", entry.name);
+    failure()->note(entry.file.error(), "Failed to write to", entry.file.name());
     qv_log()->error("[split writer] Failed to write to %s.", narrow.c_str());
     entry.file.close();
     return false;
@@ -227,14 +261,14 @@ bool QvBsSplitAudio::writeChannels(bufstream* ring, unsigned bytes) {
 bool QvBsSplitAudio::writeItem(int file, const unsigned char* data, unsigned bytes) {
     auto& entry = *wav_->files[static_cast<size_t>(file)];
     if (entry.file.write(data, bytes)) return true;
-    failure()->report(entry.file.error(), "Failed to write to", entry.name);
+    failure()->report(entry.file.error(), "Failed to write to", entry.file.name());
     return false;
 }
 
 bool QvBsSplitAudio::closeFile(int file) {
     auto& entry = *wav_->files[static_cast<size_t>(file)];
     if (entry.file.close()) return true;
-    failure()->report(entry.file.error(), "Failed to write to", entry.name);
+    failure()->report(entry.file.error(), "Failed to write to", entry.file.name());
     return false;
 }
 
@@ -253,5 +287,5 @@ void QvBsSplitAudio::onStreamEnd() {
 }
 
 void QvBsSplitAudio::_writeWavHeaders() {
-    for (const auto& entry : wav_->files) writeWavHeader(entry->name, wav_->fileFormat(), *failure());
+    for (const auto& entry : wav_->files) writeWavHeader(entry->file.name(), wav_->fileFormat(), *failure());
 }

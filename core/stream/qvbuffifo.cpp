@@ -99,7 +99,9 @@ void countWritten(CallbackFifo* cb, unsigned n) {
 }
 
 unsigned char* cbRequest(bufstream* bs, unsigned n) {
-    return callbackOf(bs)->stopped ? nullptr : FifoOps::inRequest(bs, n);
+    if (callbackOf(bs)->stopped) return nullptr;
+    fifoOf(bs)->ring->rewindIfEmpty();
+    return FifoOps::inRequest(bs, n);
 }
 
 unsigned cbConfirm(bufstream* bs, unsigned n) {
@@ -110,6 +112,7 @@ unsigned cbConfirm(bufstream* bs, unsigned n) {
 
 unsigned cbCopy(bufstream* bs, unsigned char* p, unsigned n) {
     if (callbackOf(bs)->stopped) return 0;
+    fifoOf(bs)->ring->rewindIfEmpty();
     const unsigned done = FifoOps::inCopy(bs, p, n);
     countWritten(callbackOf(bs), done);
     return done;

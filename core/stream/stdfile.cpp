@@ -17,8 +17,8 @@ bool StdFile::open(const QvWideString& name, const char* mode) {
     return check(file_ != nullptr);
 }
 
-void StdFile::setBuffer(size_t bytes) {
-    if (file_) std::setvbuf(file_, nullptr, _IOFBF, bytes);
+void StdFile::setUnbuffered() {
+    if (file_) std::setvbuf(file_, nullptr, _IONBF, 0);
 }
 
 size_t StdFile::writeSome(const void* data, size_t bytes) {

@@ -15,8 +15,8 @@ class StdFile {
 
     // Results are false, or short, on failure; error() then has the reason as an errno value.
     bool open(const QvWideString& name, const char* mode);
-    // A buffer of the C library of this size, for many small writes; to be set before the first of them.
-    void setBuffer(size_t bytes);
+    // Each write goes to the system as it is; to be called before the first.
+    void setUnbuffered();
     bool isOpen() const { return file_ != nullptr; }
     bool write(const void* data, size_t bytes) { return writeSome(data, bytes) == bytes; }
     size_t writeSome(const void* data, size_t bytes);
