@@ -60,7 +60,7 @@ bool MetadataStorage::remove(unsigned slot) {
 }
 
 bool MetadataStorage::length(StdFile& file, void* info, unsigned size) {
-    if (!file.isOpen() || !info || size < sizeof(uint32_t)) return false;
+    if (!file.isOpen() || !info || (size && size < sizeof(uint32_t))) return false;
     const long long bytes = file.length();
     if (bytes < 0) return false;
     const auto word = static_cast<uint32_t>(std::min<long long>(bytes, UINT32_MAX));
