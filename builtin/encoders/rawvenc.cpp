@@ -125,7 +125,11 @@ int RawVideoEnc::writeFrame(QvFrame* frame) {
         havePicture_ = true;
     }
     if (worker_.joinable()) return enqueue(*frame);
-    return report(writeOut(*frame));
+    // A block that an output without a known fault does not give is a broken contract.
+    const auto outcome = writeOut(*frame);
+    const int result = report(outcome);
+    QV_ASSERT_MSG(!outcome.noBlock, errorDesc());
+    return result;
 }
 
 QvFrame* RawVideoEnc::lastFrame() { return havePicture_ ? &picture_ : nullptr; }
@@ -160,13 +164,11 @@ RawVideoEnc::Outcome RawVideoEnc::writePicture(const QvFrame& picture, int annou
     return {};
 }
 
-// A block that an output without a known fault does not give is a broken contract.
 int RawVideoEnc::report(const Outcome& outcome) {
     if (outcome.status == 0) return QvStatus::ok;
     if (!outcome.noBlock) return setError(outcome.status, "%s", outcome.text.c_str());
     const auto asked = static_cast<int>(outcome.asked);
     setError(outcome.status, "Error in raw encoder, can not allocate buffer, size=%d", asked);
-    if (!worker_.joinable()) QV_FAIL(errorDesc());
     return outcome.status;
 }
 

@@ -26,7 +26,7 @@ AnyDict describe(const QvEncoder& encoder, int type) {
             Any value;
             encoder.getParam(row.param, value);
             if (!value.isValid()) encoder.getParam(row.key, value);
-            info.set(row.key, value);
+            if (value.isValid()) info.set(row.key, value);
         }
     };
     if (type == qvVideoStream)
@@ -45,7 +45,7 @@ void EncodePipe2::store(AnyDict& state) const {
     state.set("name", name());
     Any filename;
     getParam("filename", filename);
-    state.set("filename", filename);
+    if (filename.isValid()) state.set("filename", filename);
     state.set("createOutFolder", createOutFolder_ ? 1 : 0);
     storeCommon(state);
 }

@@ -181,6 +181,20 @@ TEST_F(RawVideo, FailureOfTheWorkerReachesTheCaller) {
     EXPECT_EQ(enc().close(), 0);
 }
 
+TEST_F(RawVideo, BlockRefusedToTheWorkerIsAStatus) {
+    format(QvFourcc::GRAY, 32, 32);
+    enc().setParam("accelerationOn", 1);
+    out_.failAfter = 1500;
+    start();
+    QvFrame frame = makePicture(QvFourcc::GRAY, 32, 32);
+    for (int i = 0; i < 3; ++i) enc().writeFrame(&frame);
+    EXPECT_EQ(enc().close(), -1);
+    EXPECT_STREQ(enc().errorDesc(), "Error in raw encoder, can not allocate buffer, size=1024");
+    ASSERT_EQ(enc().open(), 0);
+    enc().writeFrame(&frame);
+    enc_.reset();  // open, and failing
+}
+
 TEST_F(RawVideo, RefusesWhatDoesNotFit) {
     format(QvFourcc::I420, 64, 48);
     QvFrame good = makePicture(QvFourcc::I420, 64, 48);
