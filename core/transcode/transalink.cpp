@@ -4,6 +4,7 @@
 #include "core/decode/qvdecoder.h"
 #include "core/encode/qvencodepipe.h"
 #include "core/engine/optionalparam_p.h"
+#include "core/engine/qvexception.h"
 #include "core/engine/qvlog.h"
 #include "core/engine/qvutil.h"
 #include "core/filter/qvprocesspipe.h"
@@ -68,7 +69,7 @@ int TransALink::open(const AnyDict* params) {
     QV_ASSERT(decoder_->isSelected(qvAudioStream, decStreamNr_));
     takeMatrix(params);
     MediaTime delay;
-    buildPipe(params, delay);
+    if (const int result = buildPipe(params, delay)) return result;
 
     const long long samples = stream.getInt64("samples", unknownLength);
     qv_dbg()->debug("ALink.open: input stream has %lld samples", samples);
@@ -124,7 +125,7 @@ void TransALink::takeMatrix(const AnyDict* params) {
     _verifyConnMatrix();
 }
 
-void TransALink::buildPipe(const AnyDict* params, MediaTime& delay) {
+int TransALink::buildPipe(const AnyDict* params, MediaTime& delay) {
     AudioJobDescription job;
     job.inBitsPerSample = inBits_;
     job.inSamplerate = inSamplerate_;
@@ -134,7 +135,12 @@ void TransALink::buildPipe(const AnyDict* params, MediaTime& delay) {
     job.outChannels = outChannels_;
     job.connMatrix = connMatrix_;
     if (params) job.filters = params->getDict("audioEffects").getVector("customFilters");
-    audioPipe_.reset(QvProcessUtil::createAudioPipe(job, delay));
+    try {
+        audioPipe_.reset(QvProcessUtil::createAudioPipe(job, delay));
+    } catch (const QvAssertFailure& failure) {
+        return pipeFailed(failure);
+    }
+    return QvStatus::ok;
 }
 
 // Sound that is to come earlier starts later in its input.

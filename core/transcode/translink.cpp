@@ -1,7 +1,10 @@
 #include "core/transcode/translink.h"
 
+#include <cstring>
+
 #include "core/decode/qvdecoder.h"
 #include "core/encode/qvencodepipe.h"
+#include "core/engine/qvexception.h"
 #include "core/engine/qvlog.h"
 #include "core/engine/qvregistry.h"
 #include "core/engine/qvutil.h"
@@ -107,6 +110,12 @@ int TransLink::setError(int code, const Any& text) {
 void TransLink::copyError(int code, const Any& text) {
     errorCode_ = code;
     errorDesc_ = code != 0 && text.isString() ? text : Any("");
+}
+
+int TransLink::pipeFailed(const QvException& failure) {
+    // An assertion's text follows the line with its place.
+    const char* text = std::strrchr(failure.what(), '\n');
+    return setError(QvStatus::failed, text ? text + 1 : failure.what());
 }
 
 void TransLink::nameStreams() {

@@ -21,6 +21,7 @@ class QvAudioEncoder;
 class QvCodec;
 class QvDecodePipe;
 class QvEncodePipe;
+class QvException;
 class QvPSNRLogger;
 class QvVProcessPipe;
 
@@ -81,6 +82,7 @@ class QV_API TransLink {
   protected:
     Any _encPar(const char* name) const;  // "video0/NAME": a parameter of this stream on the encoder pipe
     int setError(int code, const Any& text);
+    int pipeFailed(const QvException& failure);  // why a conversion can't be built, as this link's error
     void copyError(int code, const Any& text);
     void nameStreams();
     void readLogProgress();
@@ -148,6 +150,7 @@ class QV_API TransVLink : public TransLink {
     int takeFrameRange(const AnyDict* params, const AnyDict& stream);
     bool applyChapters(const AnyDict* params);
     void describeJob(const AnyDict* params, const AnyDict& stream);
+    int buildPipe();
     void _setTotalVDuration();
     bool pipeAllowsSmartRender() const;
     void setupSmartRender(bool wanted);
@@ -224,7 +227,7 @@ class QV_API TransALink : public TransLink {
     bool verifySource(const Any& source, int channel, int index) const;
     void logMatrix() const;
     void takeMatrix(const AnyDict* params);
-    void buildPipe(const AnyDict* params, MediaTime& delay);
+    int buildPipe(const AnyDict* params, MediaTime& delay);
     void shiftPoints(const MediaTime& delay, const MediaTime& end);
     void computeRange();
     void setupSmartRender(const AnyDict* params);

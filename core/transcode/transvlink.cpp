@@ -4,6 +4,7 @@
 #include "core/decode/qvdecoder.h"
 #include "core/encode/qvencodepipe.h"
 #include "core/engine/optionalparam_p.h"
+#include "core/engine/qvexception.h"
 #include "core/engine/qvlog.h"
 #include "core/engine/qvnum.h"
 #include "core/engine/qvutil.h"
@@ -89,8 +90,7 @@ int TransVLink::open(const AnyDict* params) {
     const bool chapters = applyChapters(params);
     describeJob(params, stream);
     QV_ASSERT(decViews_ >= encViews_);
-    videoPipe_.reset(QvProcessUtil::createVideoPipeMV(job_, encViews_));
-    _setTotalVDuration();
+    if (const int result = buildPipe()) return result;
     QvProcessUtil::adjustVideoEncoder(job_, videoPipe_.get(), encoder_, encStreamNr_);
     setupSmartRender(params && params->get("smartRender").isTrue() && !chapters);
     for (const auto& source : metaSources_)
@@ -167,6 +167,16 @@ void TransVLink::describeJob(const AnyDict* params, const AnyDict& stream) {
     job_.outWidth = encoder_->getParam(_encPar("width").asString()).asInt32(0);
     job_.outHeight = encoder_->getParam(_encPar("height").asString()).asInt32(0);
     if (params && params->get("effects").isDict()) job_.filters = params->get("effects").asDict();
+}
+
+int TransVLink::buildPipe() {
+    try {
+        videoPipe_.reset(QvProcessUtil::createVideoPipeMV(job_, encViews_));
+    } catch (const QvAssertFailure& failure) {
+        return pipeFailed(failure);
+    }
+    _setTotalVDuration();
+    return QvStatus::ok;
 }
 
 // Filters that fade or count need to know how many frames they will see.

@@ -44,7 +44,7 @@ class AnyParamFilter : public Base {
     }
     int open() override {
         this->setState(static_cast<QvCodec::State>(3));
-        return openResult;
+        return openResult ? openResult : known.getInt32("refuseOpen", 0);
     }
     int close() override {
         ++closed;

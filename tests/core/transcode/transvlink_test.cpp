@@ -118,6 +118,22 @@ TEST(TransVLink, ASourceWithoutRateIsRefused) {
     }
 }
 
+TEST(TransVLink, SaysWhichConverterIsMissing) {
+    Job video(10, QvFramerate::f25p(), QvFramerate::f50p());
+    EXPECT_EQ(video.open(), -1);
+    EXPECT_STREQ(video.link.errorDesc(), "filter module 'frconvert' is not available");
+}
+
+TEST(TransVLink, AFilterThatDoesNotOpenIsAnErrorOfTheLink) {
+    FakePlugin plugin;
+    plugin.video("logo").add(new QvVfModule);
+    const AnyDict logo("name", "logo", "_on", 1, "refuseOpen", -3);
+    const AnyDict params("effects", AnyDict("customFilters", AnyVector(Any(logo))));
+    Job job(10, QvFramerate::f25p(), QvFramerate::f25p());
+    EXPECT_EQ(job.open(&params), -1);
+    EXPECT_NE(std::string(job.link.errorDesc()).find("logo"), std::string::npos);
+}
+
 TEST(TransVLink, TruncatedInputEndsWithoutError) {
     LogCapture log;
     Job job(10, QvFramerate::f25p(), QvFramerate::f25p());
