@@ -251,6 +251,16 @@ TEST(NavigationFixup, EachFileIsItsOwnWorld) {
     });
 }
 
+// A cell goes on in the next file, though each file counts its sectors from 0.
+TEST(NavigationFixup, CellsAndFilesTogether) {
+    Program program = longProgram(8);
+    program.segmentStarts = {0, 4};
+    program.cells = {0, 2, 6};
+    checkAll(program, [](int i) {
+        return i < 2 ? std::pair(0, 1) : i < 6 ? std::pair(2, 5) : std::pair(6, 7);
+    });
+}
+
 TEST(NavigationFixup, GapsWithoutVideoAreSeenAtAFixedPoint) {
     Program program;
     for (int i = 0; i < 40; ++i) program.vobus.push_back({1, halfSecond, i < 2 || i == 30});
