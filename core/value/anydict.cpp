@@ -13,30 +13,56 @@
 
 namespace {
 
-// The first eight bytes of a key as one number that sorts as they do: signed bytes, a missing byte first.
-std::uint64_t headOf(std::string_view key) {
-    std::uint64_t head = 0;
-    const std::size_t count = std::min<std::size_t>(key.size(), 8);
-    for (std::size_t i = 0; i < count; ++i) head = head << 8 | (static_cast<unsigned char>(key[i]) ^ 0x80u);
-    return count == 0 ? 0 : head << (64 - 8 * count);
+std::uint64_t byteAt(std::string_view text, std::size_t i) { return static_cast<unsigned char>(text[i]); }
+
+// Four bytes as a number, the first one highest.
+std::uint64_t fourAt(std::string_view text, std::size_t i) {
+    return byteAt(text, i) << 24 | byteAt(text, i + 1) << 16 | byteAt(text, i + 2) << 8 | byteAt(text, i + 3);
 }
 
+// Eight bytes of a key as one number that sorts as they do: signed, a missing byte first. Built of few loads,
+// which overlap where less than eight bytes are there.
+[[gnu::always_inline]] inline std::uint64_t wordAt(std::string_view key, std::size_t from) {
+    if (from >= key.size()) return 0;
+    const std::string_view part = key.substr(from, 8);
+    const std::size_t size = part.size();
+    const auto shift = static_cast<int>(64 - 8 * size);
+    std::uint64_t word = 0;
+    if (size == 8)
+        word = fourAt(part, 0) << 32 | fourAt(part, 4);
+    else if (size >= 4)
+        word = fourAt(part, 0) << 32 | fourAt(part, size - 4) << shift;
+    else
+        word = byteAt(part, 0) << 56 | byteAt(part, size / 2) << (56 - 8 * (size / 2)) |
+               byteAt(part, size - 1) << shift;
+    return word ^ (0x8080808080808080u >> shift << shift);
+}
+
+// The first bytes of a key decide most comparisons.
+struct KeyHead {
+    static constexpr std::size_t size = 16;
+    std::uint64_t first, second;
+
+    explicit KeyHead(std::string_view key) : first(wordAt(key, 0)), second(wordAt(key, 8)) {}
+    bool operator==(const KeyHead&) const = default;
+};
+
 struct SoughtKey {
-    std::uint64_t head;
+    KeyHead head;
     std::string_view text;
 
-    explicit SoughtKey(std::string_view key) : head(headOf(key)), text(key) {}
+    explicit SoughtKey(std::string_view key) : head(key), text(key) {}
     std::string_view view() const { return text; }
 };
 
 // A stored key lies whole in its tree node.
 struct StoredKey {
-    std::uint64_t head;
+    KeyHead head;
     std::uint32_t length;
     AString<AnyDict::maxKeyLength> text;
 
     explicit StoredKey(std::string_view key)
-        : head(headOf(key)), length(static_cast<std::uint32_t>(key.size())), text(key.data()) {}
+        : head(key), length(static_cast<std::uint32_t>(key.size())), text(key.data()) {}
     std::string_view view() const { return {text.c_str(), length}; }
 };
 
@@ -47,15 +73,20 @@ struct KeyOrder {
 
     template <class A, class B>
     bool operator()(const A& a, const B& b) const {
-        if (a.head != b.head) return a.head < b.head;
+        if (a.head.first != b.head.first) return a.head.first < b.head.first;
+        if (a.head.second != b.head.second) return a.head.second < b.head.second;
         const std::string_view x = a.view();
         const std::string_view y = b.view();
         const std::size_t common = std::min(x.size(), y.size());
-        for (std::size_t i = 8; i < common; ++i)
+        for (std::size_t i = KeyHead::size; i < common; ++i)
             if (x[i] != y[i]) return static_cast<signed char>(x[i]) < static_cast<signed char>(y[i]);
         return x.size() < y.size();
     }
 };
+
+inline bool same(const SoughtKey& a, const StoredKey& b) {
+    return a.head == b.head && a.text.size() == b.length && (b.length <= KeyHead::size || a.text == b.view());
+}
 
 using Tree = std::map<StoredKey, Any, KeyOrder>;
 
@@ -116,8 +147,9 @@ int AnyDict::size() const { return impl_ ? static_cast<int>(impl_->tree.size()) 
 
 Any* AnyDict::lookup(std::string_view key) const {
     if (!impl_ || key.size() > maxKeyLength) return nullptr;
-    const auto found = impl_->tree.find(SoughtKey(key));
-    return found == impl_->tree.end() ? nullptr : &found->second;
+    const SoughtKey sought(key);
+    const auto place = impl_->tree.lower_bound(sought);
+    return place != impl_->tree.end() && same(sought, place->first) ? &place->second : nullptr;
 }
 
 Any& AnyDict::get(const char* key) {
@@ -138,7 +170,7 @@ Any& AnyDict::slot(const char* key) {
     Tree& tree = writable().tree;
     const SoughtKey sought(std::string_view(key, strnlen(key, maxKeyLength)));
     const auto place = tree.lower_bound(sought);
-    if (place != tree.end() && !KeyOrder()(sought, place->first)) return place->second;
+    if (place != tree.end() && same(sought, place->first)) return place->second;
     return tree.try_emplace(place, StoredKey(sought.text))->second;
 }
 

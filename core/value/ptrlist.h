@@ -12,17 +12,17 @@ class AnyVector;
 // The untyped list behind TPtrList and TRefList. Copies share the pointees.
 class QV_API PtrListImp {
   public:
-    PtrListImp() noexcept;
+    PtrListImp() = default;
     // Takes the pointer that each element holds, as toVector() gives them.
     explicit PtrListImp(const AnyVector& pointers);
-    PtrListImp(const PtrListImp& other);
-    PtrListImp(PtrListImp&& other) noexcept;
+    PtrListImp(const PtrListImp& other) = default;
+    PtrListImp(PtrListImp&& other) noexcept = default;
     virtual ~PtrListImp();
-    PtrListImp& operator=(const PtrListImp& other);
-    PtrListImp& operator=(PtrListImp&& other) noexcept;
+    PtrListImp& operator=(const PtrListImp& other) = default;
+    PtrListImp& operator=(PtrListImp&& other) noexcept = default;
 
-    int size() const { return array_ ? static_cast<int>(array_->size()) : 0; }
-    bool empty() const { return size() == 0; }
+    int size() const { return static_cast<int>(array_.size()); }
+    bool empty() const { return array_.empty(); }
     void clear();  // keeps the array for the next use
     // A Generic of size 0, a borrowed pointer, for each entry.
     AnyVector toVector() const;
@@ -34,12 +34,10 @@ class QV_API PtrListImp {
     void insert(int index, void* pointer);  // in front of `index`; -1 appends; else an assertion
     void* remove(int index);                // what was taken out, null outside the range
     int find(const void* pointer) const;    // the first index, or -1
-    void* const* data() const { return array_ ? array_->data() : nullptr; }
+    void* const* data() const { return array_.data(); }
 
   private:
-    std::vector<void*>* array_ = nullptr;  // made with the first entry
-
-    std::vector<void*>& array();
+    std::vector<void*> array_;
 };
 
 // Objects that somebody else will delete.

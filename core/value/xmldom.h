@@ -10,7 +10,7 @@
 // Texts of a document are Strings where they are ASCII, else WStrings; names are always Strings, in UTF-8.
 #pragma once
 
-#include <memory>
+#include <cstddef>
 #include <string>
 
 #include "core/arch/api.h"
@@ -29,8 +29,12 @@ class QV_API XmlNode {
     XmlNode& operator=(const XmlNode&) = delete;
     virtual ~XmlNode();
 
-    const char* name() const { return name_.asString(nullptr); }  // null for a node without a name
-    void setName(const char* name);                               // null takes the name away
+    // Nodes come and go in great numbers: they are cut from large blocks.
+    static void* operator new(std::size_t size);
+    static void operator delete(void* node);
+
+    const char* name() const { return named_ ? name_.c_str() : nullptr; }  // null for a node without a name
+    void setName(const char* name);                                        // null takes the name away
     // "ns:item" becomes "item"; a name with no or more than one colon stays.
     void stripXMLNamespace(bool recursive);
 
@@ -63,8 +67,9 @@ class QV_API XmlNode {
   private:
     std::string data_;
     int capacity_ = 512;  // the bound of sprintf; memory is taken as needed
+    bool named_ = false;
     AnyDict attributes_;
-    Any name_;
+    std::string name_;
     TPtrList<XmlNode> children_;
 };
 

@@ -4,6 +4,7 @@
 
 #include "core/arch/cformat.h"
 #include "core/value/anytext_p.h"
+#include "core/value/blockmemory_p.h"
 #include "core/value/qvassert.h"
 #include "core/value/utf.h"
 #include "core/value/xmldom.h"
@@ -12,6 +13,9 @@
 Any qvXmlText(std::string_view text) {
     return qvIsAscii(text) ? qvTextOf(text) : qvTextOf(QvWideView(QvUtf::toUtf16(text)));
 }
+
+void* XmlNode::operator new(std::size_t size) { return QvBlockMemory::take(size); }
+void XmlNode::operator delete(void* node) { QvBlockMemory::giveBack(node); }
 
 XmlNode::XmlNode(const char* name, const char** attrs, XmlNode* parent, const char* data) {
     setName(name);
@@ -23,10 +27,11 @@ XmlNode::XmlNode(const char* name, const char** attrs, XmlNode* parent, const ch
 XmlNode::~XmlNode() { deleteChildren(); }
 
 void XmlNode::setName(const char* name) {
+    named_ = name != nullptr;
     if (name)
         name_ = name;
     else
-        name_.invalidate();
+        name_.clear();
 }
 
 void XmlNode::stripXMLNamespace(bool recursive) {
@@ -65,7 +70,7 @@ void XmlNode::sprintf(const char* format, ...) {
 
 XmlNode* XmlNode::child(const char* name) const {
     for (XmlNode* const node : children_)
-        if (node->name_ == name) return node;
+        if (node->named_ && name && node->name_ == name) return node;
     return nullptr;
 }
 

@@ -167,7 +167,7 @@ bool qvIsXmlName(const char* name) {
     }
     const std::unique_ptr<XML_ParserStruct, void (*)(XML_Parser)> expat(XML_ParserCreate("UTF-8"),
                                                                         XML_ParserFree);
-    const std::string document = "<" + std::string(text) + "/>";
+    const std::string document = std::string("<").append(text).append("/>");
     return expat &&
            XML_Parse(expat.get(), document.data(), static_cast<int>(document.size()), 1) == XML_STATUS_OK;
 }
