@@ -138,7 +138,9 @@ RawVideoEnc::Outcome RawVideoEnc::writeOut(const QvFrame& frame) {
     if (type_ == QvFourcc::v210) {
         const QvFrame* picture = nullptr;
         if (auto outcome = convert(frame, picture); outcome.status != 0) return outcome;
-        return writePicture(*picture, frame.total_bytes());
+        auto outcome = writePicture(*picture, frame.total_bytes());
+        converter_->next();
+        return outcome;
     }
     if (isPacked(frame)) return writePicture(frame, frame.total_bytes());
     if (const int result = copyPacked(packed_, frame)) return {result, false, 0, "Out of memory"};

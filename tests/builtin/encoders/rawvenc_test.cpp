@@ -227,6 +227,12 @@ TEST_F(RawVideo, V210NeedsItsConverter) {
     format(QvFourcc::v210, 1280, 720);
     EXPECT_EQ(number("selectedFOURCC"), static_cast<int>(QvFourcc::Y216));
     EXPECT_EQ(number("_outFrameSize"), 128 * ((1280 + 47) / 48) * 720);
+    start();
+    QvFrame frame = makePicture(QvFourcc::Y216, 1280, 720);
+    EXPECT_EQ(enc().writeFrame(&frame), -1) << "no module is registered here";
+    EXPECT_STREQ(enc().errorDesc(), "There is no colour converter for v210");
+    EXPECT_TRUE(out_.data.empty());
+    EXPECT_EQ(enc().close(), 0);
 }
 
 TEST_F(RawVideo, KeepsTheLatestFrameWhenAsked) {
