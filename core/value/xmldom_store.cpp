@@ -52,7 +52,10 @@ int XmlParser::restoreDict(const Any& path, AnyDict& dict, Any& rootName, Any& v
     if (!root) return result;
     rootName = root->name();
     if (root->getAttr("version").isString()) version = root->getAttr("version");
-    if (root->nrChildren() == 0) return -1;
+    if (root->nrChildren() == 0) {
+        qv_dbg()->error("XmlParser.restoreDict: %s holds no entries", path.toString().asString(""));
+        return -1;
+    }
 
     timer.start();
     const bool wrapped = root->nrChildren() == 1 && root->child(0)->name() == std::string_view("dict");

@@ -72,7 +72,8 @@ class QV_API XmlTrans {
 
 // The compact form of dictionaries, a child an entry: <width type="i32">720</width>. Keys must be XML names;
 // all of them are written. It also reads the form of XmlTrans. An element that is not named `dict` gives its
-// name as "__class__", so a nested dictionary comes back with its key as its class.
+// name as "__class__", so a nested dictionary comes back with its key as its class; and the kind of a bit
+// rate, which the type's name takes the place of, comes back as 0.
 class QV_API XmlTransCustomDict : public XmlTrans {
   public:
     void XmlToDict(const XmlNode* from, AnyDict& to) override;
