@@ -100,7 +100,7 @@ class Document {
   private:
     Document() : file_(std::filesystem::temp_directory_path() / ("value-bench-" + std::to_string(getpid()))) {
         AnyVector& tasks = dict_.set("tasks", AnyVector()).asVector();
-        for (int i = 0; i < 6300; ++i) tasks.append(taskOf(i));
+        for (int i = 0; i < 7500; ++i) tasks.append(taskOf(i));
         XmlParser::storeDict(file_.c_str(), dict_, "BatchList");
         std::ifstream in(file_, std::ios::binary);
         bytes_.assign(std::istreambuf_iterator<char>(in), {});
