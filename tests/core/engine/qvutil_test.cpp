@@ -8,18 +8,14 @@
 
 #include "core/arch/widename.h"
 #include "core/engine/qvfileutil.h"
+#include "core/media/fourcc.h"
 #include "core/media/qvframerate.h"
 
 namespace {
 
-unsigned fcc(const char* text) {
-    unsigned value = 0;
-    for (int i = 3; i >= 0; --i) value = value << 8 | static_cast<unsigned char>(text[i]);
-    return value;
-}
-bool equal(const char* a, const char* b) { return QvUtil::equalFcc(fcc(a), fcc(b)); }
-bool exchangeable(const char* a, const char* b) {
-    return QvUtil::exchengeableFOURCC(static_cast<int>(fcc(a)), static_cast<int>(fcc(b)));
+bool equal(const char (&a)[5], const char (&b)[5]) { return QvUtil::equalFcc(qvFourcc(a), qvFourcc(b)); }
+bool exchangeable(const char (&a)[5], const char (&b)[5]) {
+    return QvUtil::exchengeableFOURCC(static_cast<int>(qvFourcc(a)), static_cast<int>(qvFourcc(b)));
 }
 
 TEST(Util, FormatsThatStandForEachOther) {
