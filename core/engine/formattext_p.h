@@ -3,10 +3,10 @@
 
 #include <cstdarg>
 #include <cstddef>
-#include <cstdio>
 #include <cstring>
 
 #include "core/arch/api.h"
+#include "core/arch/cformat.h"
 
 // Length of the longest beginning of `text` with at most `limit` bytes that ends between two characters of
 // UTF-8. Bytes that are no UTF-8 are cut at the limit.
@@ -19,12 +19,13 @@ inline std::size_t qvCutLength(const char* text, std::size_t limit) {
     return limit;
 }
 
-// printf into a buffer on the stack, at most `Limit` characters. A null format gives "".
+// printf into a buffer on the stack, at most `Limit` characters; numbers ignore the locale. A null format
+// gives "".
 template <std::size_t Limit>
 class QvFormattedText {
   public:
     QV_PRINTF(2, 0) QvFormattedText(const char* format, va_list args) {
-        const int length = format ? std::vsnprintf(text_, sizeof text_, format, args) : 0;
+        const int length = format ? qv_vformat(text_, sizeof text_, format, args) : 0;
         if (length <= 0) text_[0] = 0;
         text_[qvCutLength(text_, Limit)] = 0;
     }

@@ -9,35 +9,23 @@ namespace {
 
 constexpr int setParamColumn = 40;
 
-std::string textOf(const Any& text) {
-    const Any narrow = text.toString();
-    return narrow.asString("");
-}
-
-template <class... Args>
-std::string formatted(const char* format, Args... args) {
-    char buffer[400];  // holds the longest: "%f" of a double has up to 317 characters
-    std::snprintf(buffer, sizeof buffer, format, args...);
-    return buffer;
-}
-
-std::string valueText(const Any& value) {
+Any valueText(const Any& value) {
     switch (value.type()) {
-        case Any::Invalid: return "= n/a";
-        case Any::Int32: return formatted("= %d", value.asInt32());
-        case Any::Int64: return formatted("= %lld", value.asInt64());
-        case Any::Float: return formatted("= %f", value.asFloat());
+        case Any::Invalid: return Any("= n/a");
+        case Any::Int32: return Any::sprintf("= %d", value.asInt32());
+        case Any::Int64: return Any::sprintf("= %lld", value.asInt64());
+        case Any::Float: return Any::sprintf("= %f", value.asFloat());
         case Any::String:
-        case Any::WString: return textOf(value);
+        case Any::WString: return value.toString();
         case Any::Generic:
-            return formatted("= 0x%016llX", static_cast<unsigned long long>(
-                                                reinterpret_cast<std::uintptr_t>(value.asGeneric())));
-        case Any::Framerate: return "= " + textOf(value.asFramerate().desc(true, true));
-        case Any::Point: return formatted("= (%d, %d)", value.asPoint().x(), value.asPoint().y());
-        case Any::Pair: return formatted("= (%d, %d)", value.asPair().first, value.asPair().second);
-        case Any::Bitrate: return "= " + textOf(value.asBitrate().desc());
-        case Any::MediaTime: return formatted("= %fs", value.asMediaTime().seconds());
-        default: return "= (value)";
+            return Any::sprintf("= 0x%016llX", static_cast<unsigned long long>(
+                                                   reinterpret_cast<std::uintptr_t>(value.asGeneric())));
+        case Any::Framerate: return Any::strcat(Any("= "), value.asFramerate().desc(true, true));
+        case Any::Point: return Any::sprintf("= (%d, %d)", value.asPoint().x(), value.asPoint().y());
+        case Any::Pair: return Any::sprintf("= (%d, %d)", value.asPair().first, value.asPair().second);
+        case Any::Bitrate: return Any::strcat(Any("= "), value.asBitrate().desc());
+        case Any::MediaTime: return Any::sprintf("= %fs", value.asMediaTime().seconds());
+        default: return Any("= (value)");
     }
 }
 
@@ -48,7 +36,8 @@ std::string lineOf(const char* label, const Any& value, int indent, int column) 
     line.append(label ? label : "").append(" [").append(Any::typeName(value.type())).append("] ");
     if (isContainer(value)) return line;
     line.resize(std::max(line.size(), static_cast<std::size_t>(std::max(column, 0))), ' ');
-    return line + valueText(value);
+    const Any text = valueText(value);
+    return line + text.asString("");
 }
 
 }  // namespace

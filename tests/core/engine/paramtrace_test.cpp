@@ -6,6 +6,7 @@
 
 #include "core/engine/qvutil.h"
 #include "core/media/qvgeometry.h"
+#include "tests/support/comma_locale.h"
 #include "tests/support/log_capture.h"
 
 namespace {
@@ -42,6 +43,15 @@ TEST(ParamTrace, EveryTypeHasItsForm) {
     EXPECT_EQ(log.texts(),
               (std::vector<std::string>{std::string("r [Framerate] = ") + rate.desc(true, true).asString(),
                                         std::string("b [Bitrate] = ") + bits.desc().asString()}));
+}
+
+TEST(ParamTrace, NumbersIgnoreTheLocale) {
+    const CommaLocale locale;
+    if (!locale.active()) GTEST_SKIP() << "no locale with a decimal comma can be made here";
+    LogCapture log;
+    QvUtil::debugOutAny("v", Any(1.5), 0, 0);
+    qv_dbg()->info("%.2f", 0.25);
+    EXPECT_EQ(log.texts(), (std::vector<std::string>{"v [Float] = 1.500000", "0.25"}));
 }
 
 TEST(ParamTrace, ContainersFollowOneLevelDeeper) {
