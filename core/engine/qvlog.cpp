@@ -1,6 +1,5 @@
 #include "core/engine/qvlog.h"
 
-#include <cstdlib>
 #include <mutex>
 #include <string>
 
@@ -60,8 +59,9 @@ void callLogger(QvLogBase& logger, int mask, const char* line) {
 bool isStandard(std::FILE* stream) { return stream == stdout || stream == stderr; }
 
 Any wantedTarget(const Any* logfile) {
-    const char* variable = std::getenv("QVTARSEL_DEBUG");
-    if (variable && variable[0] && variable[0] != '0') return Any(variable);
+    std::string variable;
+    qv_platform().environment("QVTARSEL_DEBUG", variable);
+    if (!variable.empty() && variable[0] != '0') return Any(variable.c_str());
     return logfile ? logfile->toString() : Any();
 }
 
@@ -121,7 +121,7 @@ int QvDbgLog::openTarget(Any& target) {
     else if (target == "dbgout")
         debugger_ = true;
     else
-        stream_ = std::fopen(target.asString(), "w");
+        stream_ = qv_platform().openFile(target.asString(), "w");
     if (stream_ || debugger_) return QvStatus::ok;
     debug_trace(Any::sprintf("[DbgLog] *** Failed to open logfile %s for writing -> redirecting output to "
                              "stderr\n",

@@ -11,6 +11,7 @@
 #include <vector>
 
 #include "core/engine/qvexception.h"
+#include "core/engine/qvfileutil.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/temp_folder.h"
 
@@ -92,6 +93,12 @@ TEST_F(DbgLog, FileThatCannotOpenGoesToStandardError) {
     EXPECT_NE(text.find("*** Failed to open logfile"), std::string::npos);
     EXPECT_NE(text.find("[INF]"), std::string::npos);
     EXPECT_NE(text.find("still here"), std::string::npos);
+}
+
+TEST_F(DbgLog, CommandsDoNotHoldTheLogFile) {
+    const std::string file = folder_.file("held.txt");
+    ASSERT_EQ(open(file), 0);
+    EXPECT_NE(execute_process("ls -l /proc/self/fd | grep -q held.txt"), 0);
 }
 
 TEST_F(DbgLog, EnvironmentOverridesUnlessItBeginsWithZero) {
