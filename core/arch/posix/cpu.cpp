@@ -64,7 +64,7 @@ bool usable(const Feature& feature) {
 std::string QvPlatform::cpuFeatures() {
     std::string text;
     for (const Feature& feature : features)
-        if (usable(feature)) text += (text.empty() ? "" : " ") + std::string(feature.name);
+        if (usable(feature)) text.append(text.empty() ? "" : " ").append(feature.name);
     return text;
 }
 
@@ -82,7 +82,7 @@ std::string QvPlatform::cpuFeatures() {
     const unsigned long found = getauxval(AT_HWCAP);
     std::string text;
     for (const Feature& feature : features)
-        if (found & feature.bit) text += (text.empty() ? "" : " ") + std::string(feature.name);
+        if (found & feature.bit) text.append(text.empty() ? "" : " ").append(feature.name);
     return text;
 }
 
