@@ -171,7 +171,10 @@ Any QvSettingsMapper::getFieldByName(const void* record, const char* name) const
     return Any();
 }
 
-Any QvSettingsMapper::getField(const void* record, const ParamSpec& spec) const {
+Any QvSettingsMapper::getField(const void* record, const ParamSpec& row) const {
+    // The caller's row lacks the capacity that the constructor has worked out.
+    const auto own = row.name ? rows_.find(std::string_view(row.name)) : rows_.end();
+    const ParamSpec& spec = own != rows_.end() && own->second.offset == row.offset ? own->second : row;
     const char* field = static_cast<const char*>(record) + spec.offset;
     if (!isKnown(spec.type)) {
         fail(isVectorField(spec) ? "[SettingsMapper] read vector field of unsupported type (%s)"

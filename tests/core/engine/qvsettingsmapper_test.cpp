@@ -76,7 +76,8 @@ TEST_F(Mapper, TextsFitWithTheirZeroOrAreRefused) {
     EXPECT_TRUE(get("preset") == "1234567");
     EXPECT_EQ(set("preset", u"wide"), 0);
     EXPECT_TRUE(get("preset") == "wide");
-    EXPECT_EQ(set("last", "x"), -1);  // no field follows that would tell its size
+    EXPECT_TRUE(mapper.getField(&settings, rows[5]) == "wide");  // the row as the caller wrote it
+    EXPECT_EQ(set("last", "x"), -1);                             // no field follows that would tell its size
     std::memset(settings.preset, 'z', sizeof settings.preset);
     EXPECT_TRUE(get("preset") == "zzzzzzzz");  // never read beyond the field
 }
