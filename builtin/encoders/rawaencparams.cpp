@@ -116,8 +116,9 @@ std::span<const QvParamRow<RawAudioEnc>> RawAudioParams::rows() {
 }
 
 int RawAudioEnc::setParam(const char* name, const Any& value) {
-    _traceParam(name, value);
     QV_ASSERT_MSG(getState() != stateCreated, "Not inited");
+    if (!qvFindParamRow(RawAudioParams::rows(), name)) return QvAudioEncoder::setParam(name, value);
+    _traceParam(name, value);
     if (auto result = qvSetParamRow(RawAudioParams::rows(), *this, name, value)) return *result;
     return QvAudioEncoder::setParam(name, value);
 }

@@ -128,8 +128,9 @@ std::span<const QvParamRow<RawVideoEnc>> RawVideoParams::rows() {
 }
 
 int RawVideoEnc::setParam(const char* name, const Any& value) {
-    _traceParam(name, value);
     QV_ASSERT_MSG(getState() != stateCreated, "Not inited");
+    if (!qvFindParamRow(RawVideoParams::rows(), name)) return QvVideoEncoder::setParam(name, value);
+    _traceParam(name, value);
     if (auto result = qvSetParamRow(RawVideoParams::rows(), *this, name, value)) return *result;
     return QvVideoEncoder::setParam(name, value);
 }

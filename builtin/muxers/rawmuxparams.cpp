@@ -62,8 +62,7 @@ struct RawMuxParams {
 
 int RawMux::setParam(const char* name, const Any& value) {
     QV_ASSERT_MSG(getState() != qvStateOpen, "[RawMux] Invalid state");
-    _traceParam(name, value);
-    if (auto result = qvSetParamRow(RawMuxParams::rows(), *this, name, value)) return *result;
+    if (auto result = _setRow(RawMuxParams::rows(), *this, name, value)) return *result;
     return BaseMuxer::setParam(name, value);
 }
 

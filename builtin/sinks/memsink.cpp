@@ -12,8 +12,7 @@ int MemSink::setParam(const char* name, const Any& value) {
         {"filename", {}, qvParamIgnored},
         {"bufsize", {}, qvParamIgnored},
     };
-    _traceParam(name, value);
-    if (auto result = qvSetParamRow<MemSink>(rows, *this, name, value)) return *result;
+    if (auto result = _setRow<MemSink>(rows, *this, name, value)) return *result;
     return QvSink::setParam(name, value);
 }
 

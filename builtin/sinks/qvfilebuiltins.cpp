@@ -133,8 +133,7 @@ int NullSink::setParam(const char* name, const Any& value) {
         {"filename", {}, qvParamIgnored},
         {"bufsize", {}, qvParamIgnored},
     };
-    _traceParam(name, value);
-    if (auto result = qvSetParamRow<NullSink>(rows, *this, name, value)) return *result;
+    if (auto result = _setRow<NullSink>(rows, *this, name, value)) return *result;
     return QvSink::setParam(name, value);
 }
 

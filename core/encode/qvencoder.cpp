@@ -38,12 +38,7 @@ int spreadBitrate(QvVideoEncoder& encoder, const QvBitrate& rate) {
 int bitsOf(const QvVideoEncoder& encoder, const char* name) {
     Any value;
     encoder.getParam(name, value);
-    int bits = 0;
-    if (value.isFloat())
-        bits = static_cast<int>(value.asDouble());
-    else if (value.isInt())
-        bits = value.toInt32();
-    return bits;
+    return value.isFloat() || value.isInt() ? value.toInt32() : 0;
 }
 
 QvBitrate gatherBitrate(const QvVideoEncoder& encoder) {
@@ -76,12 +71,12 @@ int QvEncoder::detachOutStream() {
 int QvEncoder::abort() { return close(); }
 
 int QvVideoEncoder::setParam(const char* name, const Any& value) {
-    _traceParam(name, value);
     if (std::strcmp(name, "bitrate") == 0) {
+        _traceParam(name, value);
         if (!value.isBitrate()) return setError(QvStatus::invalidParam, "\"bitrate\" takes a bit rate");
         return spreadBitrate(*this, value.asBitrate());
     }
-    if (auto result = qvSetParamRow<QvVideoEncoder>(videoRows, *this, name, value)) return *result;
+    if (auto result = _setRow<QvVideoEncoder>(videoRows, *this, name, value)) return *result;
     return QvCodec::setParam(name, value);
 }
 
@@ -109,8 +104,7 @@ void* QvVideoEncoder::getInterface(int kind) const {
 }
 
 int QvAudioEncoder::setParam(const char* name, const Any& value) {
-    _traceParam(name, value);
-    if (auto result = qvSetParamRow<QvAudioEncoder>(audioRows, *this, name, value)) return *result;
+    if (auto result = _setRow<QvAudioEncoder>(audioRows, *this, name, value)) return *result;
     return QvCodec::setParam(name, value);
 }
 

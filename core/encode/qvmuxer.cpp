@@ -58,8 +58,7 @@ void QvMuxer::getStreamParam(int program, int stream, const char* name, Any& val
 }
 
 int QvMuxer::setParam(const char* name, const Any& value) {
-    _traceParam(name, value);
-    if (auto result = qvSetParamRow<QvMuxer>(rows, *this, name, value)) return *result;
+    if (auto result = _setRow<QvMuxer>(rows, *this, name, value)) return *result;
     return QvCodec::setParam(name, value);
 }
 

@@ -192,13 +192,20 @@ const QvParamRow<T>* qvFindParamRow(std::span<const QvParamRow<T>> rows, const c
     return nullptr;
 }
 
+// False for a name that only getParam answers.
+template <class T>
+bool qvTakesValue(const QvParamRow<T>& row) {
+    const auto* access = std::get_if<QvParamAccess<T>>(&row.member);
+    return !(row.flags & qvParamReadOnly) && (!access || access->set || (row.flags & qvParamIgnored));
+}
+
 // Sets the member behind a row. nullopt: no row takes this name, so the caller asks its base.
 // QvStatus::invalidParam: the value has a wrong type or lies outside the range; the member is unchanged.
 template <class T>
 std::optional<int> qvSetParamRow(std::span<const QvParamRow<T>> rows, T& object, const char* name,
                                  const Any& value) {
     const auto* row = qvFindParamRow(rows, name);
-    if (!row || (row->flags & qvParamReadOnly)) return std::nullopt;
+    if (!row || !qvTakesValue(*row)) return std::nullopt;
     if (row->flags & qvParamIgnored) return QvStatus::ok;
     return std::visit(
         [&](auto member) -> std::optional<int> {
@@ -206,7 +213,6 @@ std::optional<int> qvSetParamRow(std::span<const QvParamRow<T>> rows, T& object,
             if constexpr (std::is_same_v<M, std::monostate>) {
                 return QvStatus::ok;
             } else if constexpr (std::is_same_v<M, QvParamAccess<T>>) {
-                if (!member.set) return std::nullopt;
                 return member.set(object, value);
             } else {
                 return qvparam::assign(object, member, *row, value);
@@ -293,7 +299,7 @@ AnyVector qvDescribeParamRows(std::span<const QvParamRow<T>> rows, const T& defa
         if (qvGetParamRow(rows, defaults, row.name, value)) described.set("default", value);
         qvparam::describe(qvparam::kindOfRow(row), row.min, row.max, value, described);
         if (*row.description) described.set("description", row.description);
-        if (row.flags & qvParamReadOnly) described.set("readOnly", 1);
+        if (!qvTakesValue(row)) described.set("readOnly", 1);
         if (row.flags & qvParamWriteOnly) described.set("writeOnly", 1);
         all.append(described);
     }
@@ -304,7 +310,7 @@ template <class T>
 std::optional<int> QvCodec::_setRow(std::span<const QvParamRow<T>> rows, T& object, const char* name,
                                     const Any& value) {
     const auto* row = qvFindParamRow(rows, name);
-    if (!row || (row->flags & qvParamReadOnly)) return std::nullopt;
+    if (!row || !qvTakesValue(*row)) return std::nullopt;
     _traceParam(name, value);
     const std::optional<int> result = qvSetParamRow(rows, object, name, value);
     if (result == QvStatus::invalidParam) setError(*result, "%s", qvParamRefusal(rows, name, value).c_str());

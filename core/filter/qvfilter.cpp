@@ -64,13 +64,11 @@ QvVideoFilter::QvVideoFilter(const QvModule* module) : QvCodec(module), common_(
 int QvVideoFilter::init() { return QvCodec::init(); }
 
 int QvVideoFilter::setParam(const char* name, const Any& value) {
+    const bool isCommon = isCommonKey(name);
+    if (!isCommon && !isOneOf(name, {"_previewMode", "_totalFrames"})) return QvCodec::setParam(name, value);
     _traceParam(name, value);
-    if (isCommonKey(name)) {
-        common_.set(name, value);
-        return QvStatus::ok;
-    }
-    if (isOneOf(name, {"_previewMode", "_totalFrames"})) return QvStatus::ok;
-    return QvCodec::setParam(name, value);
+    if (isCommon) common_.set(name, value);
+    return QvStatus::ok;
 }
 
 void QvVideoFilter::getParam(const char* name, Any& value) const {
@@ -92,13 +90,12 @@ QvAudioFilter::QvAudioFilter(const QvModule* module) : QvCodec(module), common_(
 int QvAudioFilter::init() { return QvCodec::init(); }
 
 int QvAudioFilter::setParam(const char* name, const Any& value) {
+    const bool isCommon = isCommonKey(name);
+    if (!isCommon && !isOneOf(name, {"_previewMode", "_totalFrames", "vf_base"}))
+        return QvCodec::setParam(name, value);
     _traceParam(name, value);
-    if (isCommonKey(name)) {
-        common_.set(name, value);
-        return QvStatus::ok;
-    }
-    if (isOneOf(name, {"_previewMode", "_totalFrames", "vf_base"})) return QvStatus::ok;
-    return QvCodec::setParam(name, value);
+    if (isCommon) common_.set(name, value);
+    return QvStatus::ok;
 }
 
 void QvAudioFilter::getParam(const char* name, Any& value) const {

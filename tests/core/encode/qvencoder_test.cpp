@@ -2,6 +2,7 @@
 
 #include <gtest/gtest.h>
 
+#include <climits>
 #include <map>
 #include <string>
 #include <vector>
@@ -9,6 +10,7 @@
 #include "core/encode/qvmuxer.h"
 #include "core/engine/qvexception.h"
 #include "core/media/qvgeometry.h"
+#include "tests/support/log_capture.h"
 #include "tests/support/test_stream.h"
 
 namespace {
@@ -114,6 +116,26 @@ TEST(Encoder, BitratesAreSpreadAndGathered) {
     }
     Video video;
     EXPECT_EQ(video.setParam("bitrate", 4000000), QvStatus::invalidParam);
+    video.values = {{"vbr", 1}, {"vBitrate", 1e300}, {"minVBitrate", -1.9}, {"maxVBitrate", "x"}};
+    const QvBitrate odd = video.getParam("bitrate").asBitrate();
+    EXPECT_EQ(odd.target, INT_MAX);
+    EXPECT_EQ(odd.min, -1);
+    EXPECT_EQ(odd.max, 0);
+}
+
+TEST(Encoder, EachParameterIsTracedOnce) {
+    Video video;
+    Audio audio;
+    Muxer muxer;
+    LogCapture log;
+    for (QvCodec* codec :
+         {static_cast<QvCodec*>(&video), static_cast<QvCodec*>(&audio), static_cast<QvCodec*>(&muxer)}) {
+        codec->init();
+        codec->setParam("adjustSettings", 1);
+        EXPECT_THROW(codec->setParam("unknown", 1), QvParamException);
+    }
+    EXPECT_EQ(log.count("setParam: adjustSettings"), 3);
+    EXPECT_EQ(log.count("setParam: unknown"), 3);
 }
 
 TEST(Encoder, NamesThatEveryOneAccepts) {

@@ -44,6 +44,7 @@ constexpr QvParamRow<Settings> rows[] = {
     {"old", {}, qvParamIgnored},
     {"count", &Settings::half, qvParamReadOnly},
     {"double", QvParamAccess<Settings>{setHalf, getHalf}, qvParamStored},
+    {"view", QvParamAccess<Settings>{nullptr, getHalf}},
 };
 static_assert(qvParamTableOk<Settings>(rows));
 
@@ -148,6 +149,7 @@ TEST(Params, FlagsDecideWhoMayAsk) {
     EXPECT_EQ(set(s, "unknown", 1), std::nullopt);
     EXPECT_EQ(set(s, nullptr, 1), std::nullopt);
     EXPECT_EQ(set(s, "count", 1), std::nullopt);
+    EXPECT_EQ(set(s, "view", 1), std::nullopt);
     EXPECT_EQ(set(s, "old", "anything"), QvStatus::ok);
     EXPECT_EQ(set(s, "secret", 3), QvStatus::ok);
     EXPECT_EQ(set(s, "double", 8), QvStatus::ok);
@@ -197,13 +199,14 @@ TEST(Params, RefusalSaysWhatIsTaken) {
 
 TEST(Params, DescriptionTellsTypeRangeDefaultAndUse) {
     const AnyVector all = qvDescribeParamRows<Settings>(rows, Settings());
-    ASSERT_EQ(all.size(), 11);  // the ignored row is nobody's business
+    ASSERT_EQ(all.size(), 12);  // the ignored row is nobody's business
     EXPECT_EQ(all.at(0), Any(AnyDict("name", "frames", "type", "Int32", "min", 1.0, "max", 1000.0, "default",
                                      25, "description", "length of the fade in frames")));
     EXPECT_EQ(all.at(1),
               Any(AnyDict("name", "invert", "type", "Int32", "min", 0.0, "max", 1.0, "default", 0)));
     EXPECT_EQ(all.at(8), Any(AnyDict("name", "secret", "type", "Int32", "writeOnly", 1)));
     EXPECT_EQ(all.at(9), Any(AnyDict("name", "count", "type", "Int32", "default", 0, "readOnly", 1)));
+    EXPECT_EQ(all.at(11), Any(AnyDict("name", "view", "type", "Int32", "default", 0, "readOnly", 1)));
 }
 
 }  // namespace

@@ -54,6 +54,11 @@ TYPED_TEST(FilterContract, CommonParameters) {
     EXPECT_FALSE(filter.getParam("_totalFrames").isValid());
     EXPECT_THROW(filter.setParam("nonsense", 1), QvParamException);
     EXPECT_EQ(filter.getParam("info").asDict(), AnyDict("amount", 3, "name", "plain"));
+    filter.init();
+    LogCapture log;
+    filter.setParam("_on", 0);
+    EXPECT_THROW(filter.setParam("nonsense", 1), QvParamException);
+    EXPECT_EQ(log.count("plain.setParam: "), 2) << "a line for each call";
 }
 
 TYPED_TEST(FilterContract, StoreAddsAndRestoreChecks) {
