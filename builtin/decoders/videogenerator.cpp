@@ -4,6 +4,7 @@
 #include <cstring>
 #include <limits>
 
+#include "builtin/decoders/testtext.h"
 #include "core/engine/status.h"
 #include "core/media/qvimage.h"
 #include "core/value/ptrlist.h"
@@ -42,6 +43,7 @@ int VideoGenerator::init(const AnyDict& dict) {
     int views = dict.getInt32("nrViews", 1);
     if (views < 1 || views > maxViews) views = 1;
     params.set("nrViews", Any(views));
+    text_ = makeTestText(pictures_.front()->height());
     drawCard();
     makeViews(views);
     renderNext();

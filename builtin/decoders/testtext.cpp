@@ -1,0 +1,37 @@
+#include "builtin/decoders/testtext.h"
+
+#include "core/caption/qvsubtitlerender.h"
+#include "core/caption/qvsubtitles.h"
+#include "core/caption/qvtextrenderingoptions.h"
+#include "core/engine/qvregistry.h"
+#include "core/engine/status.h"
+
+namespace {
+
+class TestText : public CardText {
+  public:
+    int init(int height) {
+        QvTextRenderingOptions options;
+        options.fontRegular = qv_registry()->defaultFontFile(1);
+        options.charSize = height / 16 * 7 / 8;
+        return render_.init(options);
+    }
+
+    void draw(QvFrame& frame, int x, int y, const char* text) override {
+        line_.text = text;
+        line_.position = QvPoint(x, y);
+        render_.render(frame, line_, nullptr);
+    }
+
+  private:
+    QvSubtitleRender render_;
+    QvSubtitle line_;
+};
+
+}  // namespace
+
+std::unique_ptr<CardText> makeTestText(int height) {
+    auto text = std::make_unique<TestText>();
+    if (text->init(height) != QvStatus::ok) return nullptr;
+    return text;
+}

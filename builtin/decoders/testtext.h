@@ -1,0 +1,10 @@
+// The text of the test generator's pictures, in the system's fixed-pitch font.
+#pragma once
+
+#include <memory>
+
+#include "builtin/decoders/testcard.h"
+
+// Letters that suit pictures of that height. Null if text can't be drawn at all; a missing font draws
+// nothing.
+std::unique_ptr<CardText> makeTestText(int height);

@@ -1,0 +1,97 @@
+#include <algorithm>
+#include <string>
+
+#include <hb-ft.h>
+
+#include "core/caption/fontface_p.h"
+#include "core/engine/qvfileutil.h"
+#include "core/engine/qvlog.h"
+#include "core/value/any.h"
+
+namespace {
+
+// Rows of a bitmap, whose pitch is negative where the last row comes first.
+const unsigned char* rowOf(const FT_Bitmap& bitmap, int row) {
+    const auto rows = static_cast<int>(bitmap.rows);
+    const unsigned char* first =
+        bitmap.pitch >= 0 ? bitmap.buffer : bitmap.buffer - bitmap.pitch * (rows - 1);
+    return first + static_cast<std::ptrdiff_t>(row) * bitmap.pitch;
+}
+
+unsigned char coverageAt(const FT_Bitmap& bitmap, const unsigned char* row, int x) {
+    if (bitmap.pixel_mode == FT_PIXEL_MODE_MONO) return row[x / 8] & (0x80 >> x % 8) ? 255 : 0;
+    return row[x];
+}
+
+void copyBitmap(const FT_Bitmap& bitmap, FontGlyph& glyph) {
+    if (bitmap.pixel_mode != FT_PIXEL_MODE_GRAY && bitmap.pixel_mode != FT_PIXEL_MODE_MONO) return;
+    glyph.width = static_cast<int>(bitmap.width);
+    glyph.rows = static_cast<int>(bitmap.rows);
+    glyph.coverage.resize(static_cast<std::size_t>(glyph.width) * static_cast<std::size_t>(glyph.rows));
+    auto out = glyph.coverage.begin();
+    for (int y = 0; y < glyph.rows; ++y)
+        for (int x = 0; x < glyph.width; ++x) *out++ = coverageAt(bitmap, rowOf(bitmap, y), x);
+}
+
+}  // namespace
+
+FontLibrary::FontLibrary() {
+    FT_Library library = nullptr;
+    if (FT_Init_FreeType(&library) != 0) {
+        qv_dbg()->error("Failed to initialize freetype library");
+        return;
+    }
+    library_.reset(library);
+    int major = 0, minor = 0, patch = 0;
+    FT_Library_Version(library, &major, &minor, &patch);
+    qv_dbg()->info("Freetype library version %d.%d.%d initialized", major, minor, patch);
+}
+
+void FontFace::load(const FontLibrary& library, const Any& file, int pixels) {
+    glyphs_.clear();
+    shaper_.reset();
+    face_.reset();
+    const std::string name = qv_os_name(file);
+    FT_Face face = nullptr;
+    const FT_Error error = FT_New_Face(library.get(), name.c_str(), 0, &face);
+    if (error != 0) {
+        if (error == FT_Err_Unknown_File_Format)
+            qv_dbg()->info("Unsupported font type");
+        else
+            qv_dbg()->info("Failed to load font file '%s'", name.c_str());
+        return;
+    }
+    face_.reset(face);
+    if (FT_Select_Charmap(face, FT_ENCODING_UNICODE) != 0)
+        qv_dbg()->info("Error: no unicode symbols in font file %s", name.c_str());
+    if (FT_Set_Char_Size(face, 0, static_cast<FT_F26Dot6>(pixels) * 64, 0, 0) != 0)
+        qv_dbg()->info("Error setting char size to: %dpt 72dpi (default)", pixels);
+}
+
+unsigned FontFace::indexOf(char32_t character) const {
+    return face_ ? FT_Get_Char_Index(face_.get(), character) : 0;
+}
+
+const FontGlyph& FontFace::glyph(unsigned index) {
+    const auto [found, isNew] = glyphs_.try_emplace(index);
+    FontGlyph& glyph = found->second;
+    if (!isNew || !face_ || FT_Load_Glyph(face_.get(), index, FT_LOAD_RENDER) != 0) return glyph;
+    const FT_GlyphSlot slot = face_->glyph;
+    glyph.left = slot->bitmap_left;
+    glyph.top = slot->bitmap_top;
+    glyph.advance = static_cast<int>(slot->advance.x);
+    copyBitmap(slot->bitmap, glyph);
+    return glyph;
+}
+
+int FontFace::kerning(unsigned first, unsigned second) const {
+    FT_Vector move{};
+    if (!face_ || !FT_HAS_KERNING(face_.get()) || first == 0 || second == 0) return 0;
+    if (FT_Get_Kerning(face_.get(), first, second, FT_KERNING_DEFAULT, &move) != 0) return 0;
+    return static_cast<int>(std::min<FT_Pos>(move.x, 0));
+}
+
+hb_font_t* FontFace::shaper() {
+    if (!shaper_ && face_) shaper_.reset(hb_ft_font_create_referenced(face_.get()));
+    return shaper_.get();
+}

@@ -1,0 +1,58 @@
+// A font file at one size, with its glyphs kept once they have been drawn.
+#pragma once
+
+#include <memory>
+#include <unordered_map>
+#include <vector>
+
+#include <ft2build.h>
+#include FT_FREETYPE_H
+#include <hb.h>
+
+class Any;
+
+// A drawn glyph. Its top left pixel stands at pen + left, baseline - top.
+struct FontGlyph {
+    int left = 0;
+    int top = 0;
+    int width = 0;
+    int rows = 0;
+    int advance = 0;                      // 1/64 pixels
+    std::vector<unsigned char> coverage;  // width * rows, 0 to 255
+};
+
+class FontLibrary {
+  public:
+    FontLibrary();                                     // tells the outcome in the debug log
+    FT_Library get() const { return library_.get(); }  // null if FreeType can't be used
+
+  private:
+    struct Done {
+        void operator()(FT_Library library) const { FT_Done_FreeType(library); }
+    };
+    std::unique_ptr<FT_LibraryRec_, Done> library_;
+};
+
+class FontFace {
+  public:
+    // What fails is told in the debug log and leaves the face without glyphs.
+    void load(const FontLibrary& library, const Any& file, int pixels);
+    bool usable() const { return face_ != nullptr; }
+
+    unsigned indexOf(char32_t character) const;  // 0 if the font does not have it
+    const FontGlyph& glyph(unsigned index);      // empty if it can't be drawn
+    // What moves the second glyph towards the first, in 1/64 pixels; never positive.
+    int kerning(unsigned first, unsigned second) const;
+    hb_font_t* shaper();  // null if there is none
+
+  private:
+    struct FaceDone {
+        void operator()(FT_Face face) const { FT_Done_Face(face); }
+    };
+    struct ShaperDone {
+        void operator()(hb_font_t* font) const { hb_font_destroy(font); }
+    };
+    std::unique_ptr<FT_FaceRec_, FaceDone> face_;
+    std::unique_ptr<hb_font_t, ShaperDone> shaper_;
+    std::unordered_map<unsigned, FontGlyph> glyphs_;
+};

@@ -1,0 +1,45 @@
+// Draws subtitles onto pictures.
+//
+//     QvSubtitleRender render;
+//     render.init(options);                     // once
+//     render.render(frame, subtitle, nullptr);  // for each frame
+//
+// Each line of text stands in a band L = charSize * 1.15 rows below the one before. Without a position the
+// lines are centred, and the last one ends above the picture's lower edge:
+//
+//     top of the first band = height - charSize / 2 - L * rows
+//
+// "<i>", "<b>", "</i>" and "</b>" in a text change the face up to the end of the subtitle and are not drawn.
+// Text of right-to-left scripts is put in its order and shaped.
+#pragma once
+
+#include <memory>
+
+#include "core/arch/api.h"
+
+class QvColor;
+class QvFrame;
+class QvSubtitle;
+class QvTextRenderingOptions;
+
+// One thread at a time; what has been drawn is kept, so that text that stays costs no more than its blending.
+class QV_API QvSubtitleRender {
+  public:
+    QvSubtitleRender();
+    QvSubtitleRender(const QvSubtitleRender&) = delete;
+    QvSubtitleRender& operator=(const QvSubtitleRender&) = delete;
+    ~QvSubtitleRender();
+
+    // Loads the fonts. A font that can't be loaded is told in the debug log and draws nothing. 0, or -1 if
+    // FreeType can't be used. May be called again with other options.
+    int init(const QvTextRenderingOptions& options);
+
+    // Draws in place, onto any format that QvFrame::blend knows. `color`: of the letters, white if null or
+    // if it is YUV. The position counts if it lies within the picture; several lines go down from there.
+    // 0; what can't be drawn is told in the debug log.
+    int render(QvFrame& frame, const QvSubtitle& subtitle, const QvColor* color);
+
+  private:
+    struct Private;
+    std::unique_ptr<Private> p_;
+};
