@@ -6,6 +6,7 @@
 
 #include "core/encode/qvencodepipe.h"
 #include "core/encode/qvencoder.h"
+#include "core/engine/formattext_p.h"
 #include "core/engine/params.h"
 #include "core/engine/qvexception.h"
 #include "core/engine/qvlog.h"
@@ -109,11 +110,11 @@ QvTranscoder::~QvTranscoder() {
 }
 
 int QvTranscoder::setError(int code, const char* format, ...) {
-    char text[1024];
     va_list args;
     va_start(args, format);
-    std::vsnprintf(text, sizeof text, format, args);
+    const QvFormattedText<1023> formatted(format, args);
     va_end(args);
+    const char* const text = formatted.text();
     p_->errorCode = code;
     p_->errorText = text;
     qv_dbg()->log(2, "Transcoder: %s (%d)", text, code);

@@ -6,6 +6,7 @@
 
 #include "core/decode/qvdecoder.h"
 #include "core/encode/qvencodepipe.h"
+#include "core/engine/formattext_p.h"
 #include "core/engine/qvlog.h"
 #include "core/engine/status.h"
 #include "core/stream/qvbufstrm.h"
@@ -36,11 +37,11 @@ const char* QvTask::typeName(int type) {
 }
 
 int QvTask::setError(int code, const char* format, ...) {
-    char text[ERRSIZ];
     va_list args;
     va_start(args, format);
-    std::vsnprintf(text, sizeof text, format, args);
+    const QvFormattedText<ERRSIZ - 1> formatted(format, args);
     va_end(args);
+    const char* const text = formatted.text();
     errorCode_ = code;
     errorText_ = text;
     qv_dbg()->log(2, "Task: %s (%d)", text, code);
