@@ -39,7 +39,8 @@ QV_API void debug_trace1(const char* first, const char* text);  // "first text\n
 
 class QV_API QvFile {
   public:
-    // --- Names: text only, the disc is not asked ---------------------------------------------------------
+    // --- Names: text only, the disc is not asked
+
     static Any getPath(const Any& name);      // "a/b.c" -> "a/";  "c:x" -> "c:/";  "x" -> ""
     static Any getFilename(const Any& name);  // "a/b.c" -> "b.c";  "c:x" -> "x"
     static Any getBasename(const Any& name);  // "a/b.c.d" -> "b.c"
@@ -67,11 +68,13 @@ class QV_API QvFile {
     // can act there, and a leading "-" makes no option. Invalid if it is no text.
     static Any shellQuote(const Any& name);
 
-    // --- Places --------------------------------------------------------------------------------------------
+    // --- Places
+
     static Any homeDir();  // no separator at the end
     static Any tempDir();  // with a separator at the end
 
-    // --- Files ---------------------------------------------------------------------------------------------
+    // --- Files
+
     static bool isFile(const Any& name);  // exists and is no folder
     static bool isDir(const Any& name);
     static long long flength(const Any& name);        // bytes, -1 if it can't be opened
@@ -93,8 +96,8 @@ class QV_API QvFile {
     static long long freeSpace(const Any& name);  // bytes on the disc of `name`, -1 if unknown
 
     // --- Listings
-    // -------------------------------------------------------------------------------------------- Full
-    // names. Left out are "." and "..", names that begin with their only dot (".x"), and with bit 0 of
+
+    // Full names. Left out are "." and "..", names that begin with their only dot (".x"), and with bit 0 of
     // `filesOnly` folders.
     static AnyVector ls(const Any& folder, int filesOnly);
     // The numbers, ascending, of the image sequence that `name` is a member of: files of its folder with its
@@ -103,8 +106,8 @@ class QV_API QvFile {
     static AnyVector numberedSequence(const Any& name, int* digits);
 
     // --- gzip files
-    // ------------------------------------------------------------------------------------------ 0 if all
-    // `size` bytes went to the disc.
+
+    // 0 if all `size` bytes went to the disc.
     static int compress(const Any& name, const unsigned char* data, int size);
     // The contents as a Generic with its size, invalid if there are none. -1, with `out` invalid, if the file
     // can't be read, is no gzip file, is damaged, ends early, or holds more than 2,147,483,647 bytes.

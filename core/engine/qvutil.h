@@ -12,14 +12,16 @@ class QvFramerate;
 
 class QV_API QvUtil {
   public:
-    // --- Pixel formats (core/engine/pixelformats.cpp) ------------------------------------------------------
+    // --- Pixel formats (core/engine/pixelformats.cpp)
+
     // FOURCCs hold their first character in the lowest byte: "BGRA" is 0x41524742.
     static bool equalFcc(unsigned a, unsigned b);  // also BGRA and BGR4, YUY2 and YUYV
-    static bool exchengeableFOURCC(int a,
-                                   int b);  // both in one of BGRA ARGB BGR4 R32C, YUYV YUY2 UYVY, I420 YV12
+    // Both in one of BGRA ARGB BGR4 R32C, YUYV YUY2 UYVY, I420 YV12.
+    static bool exchengeableFOURCC(int a, int b);
     static int macroblocks(int width, int height);  // of 16x16, parts counted whole; 0 for no area
 
-    // --- Picture shape (core/engine/pictureaspect.cpp) -----------------------------------------------------
+    // --- Picture shape (core/engine/pictureaspect.cpp)
+
     // The pixel aspect x:y, width to height, of a picture that is shown `frameAspect` wide for 1 high. With
     // `broadcast` the sizes of television have their fixed aspects. x:y is 1:1, and the result 0, if a size
     // or the aspect is 0; -1, with 1:1, if no ratio with terms below 10000 comes near enough.
@@ -29,7 +31,7 @@ class QV_API QvUtil {
     static double getFrameAspect(int x, int y, int width, int height, bool broadcast);
 
     // --- Numbers (core/engine/qvutil.cpp)
-    // --------------------------------------------------------------------
+
     static float clip(float value, float low, float high);
     static bool equ(double a, double b, double tolerance);                             // QvNum::equ
     static int ratio(double value, int& num, int& den, int maxDen, double tolerance);  // QvNum::ratio
@@ -48,9 +50,9 @@ class QV_API QvUtil {
     static Any md5Digest(const Any& value, int maxChars);
 
     // --- Time (core/engine/timeutil.cpp)
-    // --------------------------------------------------------------------- Frame number, truncated, at a
-    // time in ticks of a 27 MHz clock. `rate` is made a fraction with a denominator below 10000. The flag
-    // belongs to the interface and changes nothing.
+
+    // Frame number, truncated, at a time in ticks of a 27 MHz clock. `rate` is made a fraction with a
+    // denominator below 10000. The flag belongs to the interface and changes nothing.
     static long long pts2FrameNr(long long pts, double rate, bool flag);
     // Truncated. 0 for a rate of 0.
     static long long samplesForFrames(int frames, const QvFramerate& rate, int samplerate);
@@ -62,7 +64,7 @@ class QV_API QvUtil {
     static void sleep(int milliseconds);
 
     // --- Facts of the build and the machine (core/engine/buildfacts.cpp)
-    // -------------------------------------
+
     static Any libraryPath();
     static Any libraryVersion();  // "2.5.10.7839"
     static Any buildDate();       // "2011-10-12"
@@ -70,7 +72,7 @@ class QV_API QvUtil {
     static Any cpuDescription();  // "Processors: 8 Features: MMX MMXEXT ..."
 
     // --- Names (core/engine/nameutil.cpp)
-    // ----------------------------------------------------------------------
+
     static Any tempDir();
     static void winFname(const Any& in, Any& out);
     static Any getExt(const Any& name, bool lower);
@@ -85,7 +87,7 @@ class QV_API QvUtil {
     static AnyVector getP2FolderStructure(const Any& root);
 
     // --- Profiles (core/engine/profiletests.cpp)
-    // ---------------------------------------------------------------
+
     static bool isProfile1(int profile);      // a number of the second scheme, 0x1000000 and above
     static bool isProfile2(int profile);      // a number of the current scheme, 0x2000000 and above
     static bool isExProfile(int profile);     // XDCAM EX, of either scheme
@@ -95,8 +97,8 @@ class QV_API QvUtil {
     static const char* cqtQualityStr(int quality, int steps);
 
     // --- Bit rates of an encode pipe, in bits per second (core/encode/rateplan.cpp)
-    // ---------------------------- Sums of the targets of the pipe's video and audio encoders. -1, with both
-    // 0, without a pipe.
+
+    // Sums of the targets of the pipe's video and audio encoders. -1, with both 0, without a pipe.
     static int getRates(const QvEncodePipe* pipe, double& video, double& audio);
     // What one video stream may take for a file of `bytes` to last `seconds`, after the audio streams and one
     // part in fifty for the multiplexer. 0 if nothing is left or an argument is not above 0.
@@ -110,15 +112,18 @@ class QV_API QvUtil {
     static Any codecStructParam(const QvCodec* codec, const char* field);
 
     // --- Decoder settings for an encoder (core/transcode/matchparams.cpp)
-    // -------------------------------------- Copies the named parameters of the decoder's stream 0 of a type,
-    // 1 video or 2 audio, to the pipe's first encoder of the type. What either side does not know is passed
-    // over with a line in the log.
+
+    // Copies the named parameters of the decoder's stream 0 of a type, 1 video or 2 audio, to the pipe's
+    // first encoder of the type; of "framerate" the nearest in the encoder's "framerateRange". What either
+    // side does not know is passed over, what the decoder lacks with a warning in the log. Nothing happens
+    // if one of them is null. Another type is an assertion.
     static void matchParams(const QvDecodePipe* decoder, int type, QvEncodePipe* pipe,
                             const AnyVector& names);
 
     // --- Parameter traces, debug log (core/engine/paramtrace.cpp)
-    // ---------------------------------------------- One line, and one for each element: `indent` levels of
-    // two blanks, label, type, and from column `column` the value.
+
+    // One line, and one for each element: `indent` levels of two blanks, label, type, and from column
+    // `column` the value.
     static void debugOutAny(const char* label, const Any& value, int indent = 0, int column = 40,
                             bool recurse = true);
     static void debugOutDict(const AnyDict& dict, int indent = 0, int column = 40);
