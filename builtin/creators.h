@@ -9,6 +9,7 @@ class QvCodec;
 QvCodec* newRawdec();
 QvCodec* newTestgen();
 QvCodec* newWavdec();
+QvCodec* newSccdec();
 QvCodec* newFilesink();
 QvCodec* newNullsink();
 QvCodec* newDummyaenc();

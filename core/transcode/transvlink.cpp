@@ -93,9 +93,12 @@ int TransVLink::open(const AnyDict* params) {
     if (const int result = buildPipe()) return result;
     QvProcessUtil::adjustVideoEncoder(job_, videoPipe_.get(), encoder_, encStreamNr_);
     setupSmartRender(params && params->get("smartRender").isTrue() && !chapters);
-    for (const auto& source : metaSources_)
+    for (const auto& source : metaSources_) {
         qvSetOptionalParam(*encoder_->videoEncoder(encStreamNr_), "ccMode",
                            static_cast<const AnyDict&>(source->params));
+        // It is read once a frame, whatever rate its own times are written at.
+        if (source->decoder != decoder_) qvSetOptionalParam(*source->decoder, "readRate", job_.inFramerate);
+    }
     finished_ = false;
     framesWritten_ = 0;
     setupLogger(params);
