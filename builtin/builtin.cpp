@@ -68,7 +68,7 @@ constexpr QvBuiltinRow registered[] = {
      {.internal = true}},
     {"memsink",      sink,         "Memory sink",                    "Memory sink",                newMemsink,
      {.internal = true}},
-    {"sccdec",       decoder,      "Scenarist SCC CC reader",        "SCC reader",                 nullptr,
+    {"sccdec",       decoder,      "Scenarist SCC CC reader",        "SCC reader",                 newSccdec,
      {.exts = "scc sc2", .priority = 10, .internal = true}},
     {"videofade",    videoFilter,  "Video fade filter",              "Video fade filter",          nullptr},
     {"audiolevel",   audioFilter,  "Audio level filter",             "Audio level filter",         nullptr},
