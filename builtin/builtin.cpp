@@ -56,7 +56,7 @@ constexpr QvBuiltinRow registered[] = {
     {"p2dec",        decoder,      "P2 decoder wrapper",             "P2 decoder wrapper",         nullptr,
      {.exts = "xml", .priority = 9}},
     {"userdata",     videoFilter,  "User data callback filter",      "User data callback filter",  nullptr},
-    {"rawavimux",    muxer,        "Uncompressed AVI muxer",         "AVI Stream",                 nullptr},
+    {"rawavimux",    muxer,        "Uncompressed AVI muxer",         "AVI Stream",                 newRawavimux},
     {"wavdec",       decoder,      "WAV file import",                "WAV file import",            newWavdec,
      {.exts = "wav", .priority = 10}},
     {"aumixdec",     decoder,      "Mixing audio import",            "Mixing audio import",        nullptr,

@@ -16,6 +16,7 @@ QvCodec* newDummyaenc();
 QvCodec* newRawmux();
 QvCodec* newRawvenc();
 QvCodec* newRawaenc();
+QvCodec* newRawavimux();
 QvCodec* newNullmux();
 QvCodec* newMemmux();
 QvCodec* newMemsink();

@@ -2,25 +2,13 @@
 #include "builtin/muxers/rawmux.h"
 #include "builtin/muxers/streamcodec.h"
 #include "core/engine/params.h"
-#include "core/engine/qvregistry.h"
 #include "core/media/qvgeometry.h"
-#include "core/preset/qvpresetmgr.h"
 #include "core/value/qvassert.h"
 
 struct RawMuxParams {
     using Mux = RawMux;
     using Access = QvParamAccess<Mux>;
 
-    static double estimateSecKb(const Mux& mux) {
-        double sum = 0;
-        for (const int type : {qvVideoStream, qvAudioStream})
-            for (int nr = 0; nr < mux.nrStreams(type); ++nr)
-                if (const auto* encoder = mux.stream(type, nr)->atachee()) {
-                    const Any part = encoder->getParam("estimateSecKb");
-                    if (part.isInt() || part.isFloat()) sum += part.toDouble();
-                }
-        return sum;
-    }
     static Any extension(const Mux& mux) {
         if (mux.nrStreams(qvVideoStream) > 0) return qvStreamExtension(*mux.stream(qvVideoStream, 0), "vid");
         if (mux.nrStreams(qvAudioStream) > 0) return "aud";
@@ -32,11 +20,6 @@ struct RawMuxParams {
             for (int nr = 0; nr < mux.nrStreams(type); ++nr) names.append(mux.outputName(type, nr));
         return names;
     }
-    static AnyVector codecs(const Mux& mux, int kind) {
-        const auto* presets = qv_registry()->presetMgr();
-        return presets ? presets->getCompatible(mux.name(), kind) : AnyVector();
-    }
-
     static std::span<const QvParamRow<Mux>> rows() {
         using M = const Mux&;
         static const QvParamRow<Mux> table[] = {
@@ -47,9 +30,9 @@ struct RawMuxParams {
             {"type", {}, qvParamIgnored},
             {"_totalFrames", &Mux::totalFrames_},
             {"rawMux", Access{nullptr, [](M, Any& v) { v = 1; }}},
-            {"estimateSecKb", Access{nullptr, [](M m, Any& v) { v = estimateSecKb(m); }}},
-            {"videoCodecs", Access{nullptr, [](M m, Any& v) { v = codecs(m, 7); }}},
-            {"audioCodecs", Access{nullptr, [](M m, Any& v) { v = codecs(m, 6); }}},
+            {"estimateSecKb", Access{nullptr, [](M m, Any& v) { v = qvEstimateSecKb(m); }}},
+            {"videoCodecs", Access{nullptr, [](M m, Any& v) { v = qvMuxerCodecs(m, 7); }}},
+            {"audioCodecs", Access{nullptr, [](M m, Any& v) { v = qvMuxerCodecs(m, 6); }}},
             {"extension", Access{nullptr, [](M m, Any& v) { v = extension(m); }}},
             {"filenames", Access{nullptr, [](M m, Any& v) { v = filenames(m); }}},
             {"filesWritten", Access{nullptr, [](M m, Any& v) { v = m.filesWritten(); }}},

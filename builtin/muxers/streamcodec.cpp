@@ -2,6 +2,9 @@
 
 #include <cstring>
 
+#include "core/encode/qvmuxer.h"
+#include "core/engine/qvregistry.h"
+#include "core/preset/qvpresetmgr.h"
 #include "core/stream/qvbufstrm.h"
 
 bool qvIsCodec(const QvCodec* codec, const char* name) {
@@ -19,4 +22,20 @@ Any qvStreamExtension(QvBufStream& stream, const char* fallback) {
             return extension;
     const auto& own = stream.getParam("extension");
     return own.isText() && own.isTrue() ? own : Any(fallback);
+}
+
+double qvEstimateSecKb(const QvMuxer& muxer) {
+    double sum = 0;
+    for (const int type : {qvVideoStream, qvAudioStream})
+        for (int nr = 0; nr < muxer.nrStreams(type); ++nr)
+            if (const auto* encoder = muxer.stream(type, nr)->atachee()) {
+                const Any part = encoder->getParam("estimateSecKb");
+                if (part.isInt() || part.isFloat()) sum += part.toDouble();
+            }
+    return sum;
+}
+
+AnyVector qvMuxerCodecs(const QvMuxer& muxer, int kind) {
+    const auto* presets = qv_registry()->presetMgr();
+    return presets ? presets->getCompatible(muxer.name(), kind) : AnyVector();
 }

@@ -24,6 +24,7 @@ struct PresetRow {
 
 constexpr PresetRow kPresets[] = {
     {QvProfile::raw, "RAW/YUV", {"rawvenc"}, {"rawaenc"}, {"rawmux"}},
+    {QvProfile::aviRaw, "Uncompressed AVI", {"rawvenc"}, {"rawaenc"}, {"rawavimux"}},
 };
 
 struct CompatRow {
