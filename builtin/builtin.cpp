@@ -76,7 +76,7 @@ constexpr QvBuiltinRow registered[] = {
 };
 static_assert(std::size(registered) == 44);
 
-// Module classes that the registry does not offer by itself; an application adds them in a plug-in of its own.
+// Module classes that the registry does not list; code of the library makes them by class ("builtin/modules.h").
 constexpr QvBuiltinRow unregistered[] = {
     {"subtitle",     videoFilter,  "Subtitle render",                "Subtitle render",            nullptr},
     {"meminput",     decoder,      "Memory input",                   "Memory input",               nullptr,
