@@ -3,6 +3,7 @@
 #include <cstdarg>
 #include <cstdio>
 #include <string_view>
+#include <utility>
 
 #include "core/encode/qvencodepipe.h"
 #include "core/encode/qvencoder.h"
@@ -58,6 +59,28 @@ void QvTranscoder::Private::assertIdle() const {
     QV_ASSERT(state.load(std::memory_order_acquire) != QvTranscoder::transcoding);
 }
 
+void QvTranscoder::Private::prepareRun() {
+    QV_ASSERT(!running);
+    if (!onRunThread()) joinWorkers();
+}
+
+void QvTranscoder::Private::beginRun() {
+    ++runNumber;
+    times.begin(0);
+    stopRequested = false;
+    running = true;
+    setState(QvTranscoder::transcoding);
+}
+
+void QvTranscoder::Private::endRun(int newState) {
+    {
+        std::lock_guard guard(lock);
+        running = false;
+        state.store(newState, std::memory_order_release);
+    }
+    changed.notify_all();
+}
+
 void QvTranscoder::Private::resume() {
     {
         std::lock_guard guard(lock);
@@ -69,13 +92,28 @@ void QvTranscoder::Private::resume() {
 void QvTranscoder::Private::waitForEnd() {
     {
         std::unique_lock guard(lock);
-        changed.wait(guard, [this] {
-            return state.load(std::memory_order_acquire) != QvTranscoder::transcoding ||
-                   runThread.load() == std::thread::id();
-        });
+        const int number = runNumber;
+        changed.wait(guard, [&] { return !running || runNumber != number; });
     }
-    worker.wait();
+    joinWorkers();
 }
+
+// Joined outside the lock, which the worker needs for its end.
+void QvTranscoder::Private::joinWorkers() {
+    std::vector<std::unique_ptr<QVThreads::QvThread>> ended;
+    std::lock_guard guard(lock);
+    ended.swap(workers);
+}
+
+thread_local const QvRunScope* QvRunScope::innermost_ = nullptr;
+
+bool QvRunScope::contains(const void* owner) {
+    for (const QvRunScope* scope = innermost_; scope; scope = scope->outer_)
+        if (scope->owner_ == owner) return true;
+    return false;
+}
+
+bool QvTranscoder::Private::onRunThread() const { return QvRunScope::contains(this); }
 
 void QvTranscoder::Private::returnTask() {
     if (!savedTask) return;
@@ -100,13 +138,14 @@ QvTranscoder::QvTranscoder(const QvTranscoder& other) : p_(std::make_unique<Priv
 QvTranscoder& QvTranscoder::operator=(const QvTranscoder& other) {
     if (this == &other) return *this;
     QvTranscoder::stop();
+    p_->joinWorkers();
     p_ = std::make_unique<Private>(other.p_->task);
     return *this;
 }
 
 QvTranscoder::~QvTranscoder() {
     QvTranscoder::stop();
-    if (p_->ownTask) p_->ownTask->unlink();
+    p_->joinWorkers();
 }
 
 int QvTranscoder::setError(int code, const char* format, ...) {
@@ -246,8 +285,8 @@ void take(AnyVector& to, const Any& from) { to = from.isVector() ? from.asVector
 int invalidParam(const char* name) {
     char text[1024];
     std::snprintf(text, sizeof text, "Transcoder.setParam - invalid param '%s'", name ? name : "");
-    qv_dbg()->debug("Exception: %s", text);
     if (!qv_registry()->throwParamException()) return QvStatus::invalidParam;
+    qv_dbg()->debug("Exception: %s", text);
     throw QvParamException(text);
 }
 
@@ -313,66 +352,73 @@ void QvTranscoder::getParam(const char* name, Any& value) const {
 // --- Running ---------------------------------------------------------------------------------------
 
 int QvTranscoder::transcode(QvTask* task, bool synchronous) {
+    p_->prepareRun();
     if (task && task != p_->task) {
-        p_->savedTask = p_->task;
-        p_->task = task;
+        p_->returnTask();  // of a run whose cbDone starts this one
+        if (task != p_->task) p_->savedTask = std::exchange(p_->task, task);
     }
-    const int result = transcode(synchronous);
+    int result = QvStatus::failed;
+    try {
+        result = transcode(synchronous);
+    } catch (...) {
+        p_->returnTask();
+        throw;
+    }
     // After a start that went well the worker puts the task back at its end.
     if (synchronous || (result != QvStatus::ok && result != QvStatus::warning)) p_->returnTask();
     return result;
 }
 
 int QvTranscoder::transcode(bool synchronous) {
-    p_->assertIdle();
-    p_->stopRequested = false;
-    p_->setState(transcoding);
+    p_->prepareRun();
+    p_->beginRun();
+    const QvRunScope scope(p_.get());
     QvTranscodeRun run(*this, *p_);
     int opened = QvStatus::failed;
     try {
         opened = run.open();
     } catch (...) {
-        p_->setState(connected);
+        qv_log()->setLogFile(Any());
+        p_->endRun(connected);
         throw;
     }
     if (opened != QvStatus::ok && opened != QvStatus::warning) {
-        p_->setState(connected);
+        p_->endRun(connected);
         return opened;
     }
-    p_->worker.wait();
     p_->synchronous = synchronous;
-    if (synchronous) {
-        p_->runThread = std::this_thread::get_id();
-        const int result = run.start();
-        p_->runThread = std::thread::id();
-        p_->setState(connected);
-        return result;
-    }
+    if (synchronous) return run.start();
     // The worker takes the run with it: it outlives this call.
-    const int started = p_->worker.start([this, run]() mutable {
-        p_->runThread = std::this_thread::get_id();
+    auto worker = std::make_unique<QVThreads::QvThread>();
+    const int started = worker->start([this, run]() mutable {
+        const QvRunScope onWorker(p_.get());
         qv_dbg()->debug("Transcoder thread started");
         run.start();
         qv_dbg()->debug("Transcoder thread exiting");
-        p_->runThread = std::thread::id();
-        p_->changed.notify_all();
     });
     if (started != QvStatus::ok) {
-        QvTranscodeRun::closeLinks(*p_->task);
-        return setError(QvStatus::failed, "Failed to spawn processing thread");
+        run.giveUp();
+        setError(QvStatus::failed, "Failed to spawn processing thread");
+        p_->endRun(transcoding);
+        return QvStatus::failed;
     }
+    std::lock_guard guard(p_->lock);
+    p_->workers.push_back(std::move(worker));
     return opened;
 }
 
 int QvTranscoder::stop() {
-    if (getState() == notConnected) {
-        p_->worker.wait();
-        return QvStatus::ok;
+    if (getState() == notConnected) return QvStatus::ok;
+    {
+        std::lock_guard guard(p_->lock);
+        if (!p_->synchronous) p_->paused = false;
+        p_->stopRequested = true;
     }
-    if (!p_->synchronous) p_->resume();
-    p_->stopRequested = true;
+    p_->changed.notify_all();
     // A callback that stops its own run can't wait for its end.
-    if (p_->runThread.load() != std::this_thread::get_id()) p_->waitForEnd();
+    if (p_->onRunThread()) return QvStatus::ok;
+    p_->waitForEnd();
+    if (isTranscoding() && !p_->running) p_->setState(connected);  // the worker could not be started
     return QvStatus::ok;
 }
 

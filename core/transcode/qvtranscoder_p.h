@@ -6,7 +6,6 @@
 #include <memory>
 #include <mutex>
 #include <string>
-#include <thread>
 #include <vector>
 
 #include "core/engine/qvthreads.h"
@@ -43,19 +42,22 @@ struct QvTranscoder::Private {
 
     // The run. `state` is published with release, so that who sees it leave 3 sees the results.
     std::atomic<int> state{QvTranscoder::notConnected};
+    // `running` ends with the run, also where a failed start leaves `state` at 3.
+    std::atomic<bool> running{false};
+    std::atomic<int> runNumber{0};
     std::atomic<bool> stopRequested{false}, firstPassRunning{false};
     std::atomic<bool> synchronous{true};
-    QVThreads::QvThread worker;
-    std::atomic<std::thread::id> runThread{};  // who runs the job now; none: nobody
-    bool inCallback = false;
+    std::atomic<bool> inCallback{false};
     bool checkDiscSpace = false, logProgress = false;
     std::vector<std::unique_ptr<QvMetadataFile>> metadataFiles;
     QvStepTimes times;
 
-    // Guards `paused`, and wakes who waits for it or for the end of the run.
+    // Guards `paused` and `workers`, and wakes who waits for a pause, a stop or the end of the run.
     mutable std::mutex lock;
     std::condition_variable changed;
     bool paused = false;
+    // Not joined yet; several when a callback of one run started the next.
+    std::vector<std::unique_ptr<QVThreads::QvThread>> workers;
 
     int errorCode = 0;
     std::string errorText;
@@ -64,8 +66,28 @@ struct QvTranscoder::Private {
     void setState(int value);
     void updateState() { setState(connectedNow() ? QvTranscoder::connected : QvTranscoder::notConnected); }
     void assertIdle() const;
+    void prepareRun();  // asserts that none is going on, and waits for the end of the worker before
+    void beginRun();
+    void endRun(int newState);
     void resume();      // clears `paused` and wakes the worker
     void waitForEnd();  // until no run is going on, and joins the worker
-    void returnTask();  // puts a saved task back
+    void joinWorkers();
+    bool onRunThread() const;  // this thread runs the job, so it can't wait for its end
+    void returnTask();         // puts a saved task back
     bool deadLocked() const;
+};
+
+// While it lives this thread runs the job of a transcoder. Scopes nest: a callback may run another one.
+class QvRunScope {
+  public:
+    explicit QvRunScope(const void* owner) : owner_(owner), outer_(innermost_) { innermost_ = this; }
+    QvRunScope(const QvRunScope&) = delete;
+    QvRunScope& operator=(const QvRunScope&) = delete;
+    ~QvRunScope() { innermost_ = outer_; }
+    static bool contains(const void* owner);
+
+  private:
+    static thread_local const QvRunScope* innermost_;
+    const void* owner_;
+    const QvRunScope* outer_;
 };

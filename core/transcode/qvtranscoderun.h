@@ -37,13 +37,16 @@ class QvProgressReport {
 
 class QvTranscodeRun {
   public:
-    QvTranscodeRun(QvTranscoder& transcoder, QvTranscoder::Private& state) : t_(transcoder), p_(state) {}
+    QvTranscodeRun(QvTranscoder& transcoder, QvTranscoder::Private& state)
+        : t_(transcoder), p_(state), number_(state.runNumber) {}
 
     // Checks the task, opens the links, seeks the inputs and opens the output. 0, -16, or a failure after
     // which nothing is left open.
     int open();
     // The run itself, from the first step to cbDone. The error, or 0.
     int start();
+    // Leaves everything closed after an open without a start.
+    void giveUp();
     // The first pass of a two-pass run: fills the statistics of each encoder that wants them.
     int analyze();
 
@@ -59,6 +62,7 @@ class QvTranscodeRun {
     void setMuxerLength();
     void copyMeta();
     int openEncoder();
+    void copyPipeError(int code);
     void logSettings() const;
     void beginLogFile();
     // start
@@ -66,6 +70,14 @@ class QvTranscodeRun {
     int mainLoop();
     int closeOutput(int result);
     int finish(int result);
+    int postprocess(const Any& command);
+    template <class Work>
+    int guarded(Work work);
+    // analyze
+    struct FirstPass;
+    int makeFirstPass(const TPtrList<TransLink>& wanted, FirstPass& pass);
+    int runFirstPass(FirstPass& pass);
+    int endFirstPass(const FirstPass& pass);
     // main loop
     void videoTurn();
     void audioTurn();
@@ -73,6 +85,7 @@ class QvTranscodeRun {
     void link(TransLink& link, int n);
     void waitWhilePaused();
     void report(QvProgressReport& progress);
+    void callProgress(double part);
     void callProcess();
     int checkDisc();
     void logTurn();
@@ -82,6 +95,7 @@ class QvTranscodeRun {
 
     QvTranscoder& t_;
     QvTranscoder::Private& p_;
+    int number_;  // of the run: a callback can have started the next one before this one has ended
 
     std::vector<TransLink*> video_, audio_;
     QvFramerate rate_;          // at which audio is measured against the frames written

@@ -8,7 +8,6 @@
 #include "core/decode/qvdecoder.h"
 #include "core/encode/qvencodepipe.h"
 #include "core/encode/qvencoder.h"
-#include "core/engine/qvexception.h"
 #include "core/engine/qvlog.h"
 #include "core/engine/qvregistry.h"
 #include "core/engine/qvtimer.h"
@@ -34,13 +33,17 @@ Any statisticsName(const Any& base, int index) {
     return Any((std::string(text.isString() ? text.asString() : "") + number).c_str());
 }
 
-// Links of the first pass, with the real link that each stands for.
-struct PassLink {
-    std::unique_ptr<TransVLink> link;
-    TransLink* real;
-};
-
 }  // namespace
+
+// The private pipe, and its links with the real link that each stands for.
+struct QvTranscodeRun::FirstPass {
+    struct Link {
+        std::unique_ptr<TransVLink> twin;
+        TransLink* real;
+    };
+    std::unique_ptr<QvEncodePipe> pipe;
+    std::vector<Link> links;
+};
 
 int QvTranscodeRun::analyze() {
     p_.firstPassRunning = true;
@@ -51,17 +54,34 @@ int QvTranscodeRun::analyze() {
         return QvStatus::ok;
     }
     QV_ASSERT(p_.metadataFiles.empty());
+    FirstPass pass;
+    if (makeFirstPass(wanted, pass) != QvStatus::ok || pass.pipe->open() != QvStatus::ok) {
+        qv_dbg()->log(2, "First (analyze) pass error");
+        return QvStatus::failed;
+    }
+    int result = runFirstPass(pass);
+    const int closed = pass.pipe->close();  // encoders may write the last of their statistics here
+    if (result == QvStatus::ok) result = closed;
+    result |= endFirstPass(pass);
+    p_.firstPassRunning = false;
+    if (result == QvStatus::ok)
+        qv_log()->info("First (analyze) pass OK.");
+    else
+        qv_log()->error("First (analyze) pass error.");
+    return result;
+}
+
+int QvTranscodeRun::makeFirstPass(const TPtrList<TransLink>& wanted, FirstPass& pass) {
     const Any base = p_.metaName.isTrue() ? p_.metaName : QvUtil::makeMetaName(qv_registry()->tempDir());
-
     QvEncodePipe& real = *p_.task->encoder();
-    std::unique_ptr<QvEncodePipe> pipe(QvEncodePipe::create());
-    if (!pipe) return QvStatus::failed;
-    if (const QvPreset* preset = real.activePreset()) pipe->applyPreset(preset->profile(), 0);
-    pipe->removeStreams(qvAllStreams);
-    pipe->setMuxer("nullmux");
-    pipe->setFilename(Any(""));
+    pass.pipe.reset(QvEncodePipe::create());
+    if (!pass.pipe) return QvStatus::failed;
+    QvEncodePipe& pipe = *pass.pipe;
+    if (const QvPreset* preset = real.activePreset()) pipe.applyPreset(preset->profile(), 0);
+    pipe.removeStreams(qvAllStreams);
+    pipe.setMuxer("nullmux");
+    pipe.setFilename(Any(""));
 
-    std::vector<PassLink> links;
     AnyVector params;
     QvTask::makeOpenParams(*p_.task, wanted, params);
     for (int i = 0; i < wanted.size(); ++i) {
@@ -69,72 +89,65 @@ int QvTranscodeRun::analyze() {
         QvVideoEncoder& encoder = *real.videoEncoder(link.encStreamNr());
         AnyDict settings, stream;
         encoder.store(settings);
-        auto file = std::make_unique<QvMetadataFile>();
-        file->init(statisticsName(base, i), std::string_view(encoder.name()) == "divxvenc");
+        p_.metadataFiles.push_back(std::make_unique<QvMetadataFile>());
+        QvMetadataFile& file = *p_.metadataFiles.back();
+        file.init(statisticsName(base, i), std::string_view(encoder.name()) == "divxvenc");
         stream.set("codec", encoder.name());
-        const int added = pipe->addVideoStream(stream);
-        QV_ASSERT_MSG(added >= 0, "Transcoder._analyze: failed to add stream");
-        QvVideoEncoder& twin = *pipe->videoEncoder(i);
+        QV_ASSERT_MSG(pipe.addVideoStream(stream) >= 0, "Transcoder._analyze: failed to add stream");
+        QvVideoEncoder& twin = *pipe.videoEncoder(i);
         twin.restore(settings);
-        twin.setParam("meta", statisticsOf(*file));
+        twin.setParam("meta", statisticsOf(file));
         twin.setParam("firstPass", Any(1));
-        p_.metadataFiles.push_back(std::move(file));
 
-        links.push_back({std::make_unique<TransVLink>(), &link});
-        TransVLink& pass = *links.back().link;
-        if (pass.init(link.decoder(), link.decStreamNr(), pipe.get(), i) != QvStatus::ok)
-            return QvStatus::failed;
-        pipe->videoStream(i)->setEnabled(true);
-        if (pass.open(&params.at(i).asDict()) != QvStatus::ok) return QvStatus::failed;
+        pass.links.push_back({std::make_unique<TransVLink>(), &link});
+        TransVLink& made = *pass.links.back().twin;
+        if (made.init(link.decoder(), link.decStreamNr(), &pipe, i) != QvStatus::ok) return QvStatus::failed;
+        pipe.videoStream(i)->setEnabled(true);
+        if (made.open(&params.at(i).asDict()) != QvStatus::ok) return QvStatus::failed;
     }
-    if (pipe->open() != QvStatus::ok) {
-        qv_dbg()->log(2, "First (analyze) pass error");
-        return QvStatus::failed;
-    }
+    return QvStatus::ok;
+}
 
+int QvTranscodeRun::runFirstPass(FirstPass& pass) {
     double rate = 0;
     const int total = totalFrames(*p_.task, rate);
     QvProgressReport progress(p_.progress, total, rate);
     progress.setPass(0, 0.5);
-    {
-        p_.inCallback = true;
-        t_.cbProgress(0);
-        p_.inCallback = false;
-    }
+    callProgress(0);
     int result = QvStatus::ok;
     p_.times.begin(QvTimer::time());
     for (bool done = false; !done && !stopping();) {
         done = true;
-        for (PassLink& pass : links) {
-            if (pass.link->finished()) continue;
-            result = pass.link->processFrame(0);
+        for (FirstPass::Link& link : pass.links) {
+            if (link.twin->finished()) continue;
+            result = link.twin->processFrame(0);
             p_.times.step(QvTimer::time());
             if (result != QvStatus::ok) {
                 stopLoop();
                 break;
             }
-            done = done && pass.link->finished();
+            done = done && link.twin->finished();
         }
-        report(progress);
+        double part = 0;
+        if (progress.due(QvTimer::time(), part) && !stopping()) callProgress(part);
         callProcess();
         if (!stopping()) waitWhilePaused();
     }
-    pipe->close();
+    return result;
+}
 
-    const bool stopped = stopping();
-    for (size_t i = 0; i < links.size(); ++i) {
-        TransLink& link = *links[i].real;
-        if (!stopped)
-            real.videoEncoder(link.encStreamNr())->setParam("meta", statisticsOf(*p_.metadataFiles[i]));
+// The real encoders take the statistics, and the inputs go back to where they were.
+int QvTranscodeRun::endFirstPass(const FirstPass& pass) {
+    int result = QvStatus::ok;
+    for (size_t i = 0; i < pass.links.size(); ++i) {
+        TransLink& link = *pass.links[i].real;
+        if (!stopping())
+            p_.task->encoder()
+                ->videoEncoder(link.encStreamNr())
+                ->setParam("meta", statisticsOf(*p_.metadataFiles[i]));
         const MediaTime in = link.inPoint();
         qv_dbg()->debug("Analyze, seeking stream %d to %f seconds", link.decStreamNr(), in.seconds());
         result |= link.decoder()->seek(in, 1, link.decStreamNr());
     }
-    p_.firstPassRunning = false;
-    links.clear();
-    if (result == QvStatus::ok)
-        qv_log()->info("First (analyze) pass OK.");
-    else
-        qv_log()->error("First (analyze) pass error.");
     return result;
 }

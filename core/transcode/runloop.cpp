@@ -7,7 +7,7 @@
 #include "core/encode/qvencodepipe.h"
 #include "core/encode/qvencoder.h"
 #include "core/encode/qvmuxer.h"
-#include "core/engine/qvexception.h"
+#include "core/engine/optionalparam_p.h"
 #include "core/engine/qvfileutil.h"
 #include "core/engine/qvlog.h"
 #include "core/engine/qvregistry.h"
@@ -24,41 +24,58 @@ constexpr int kStopped = 1;  // what cbDone gets for a run that was stopped
 
 // Set while a callback runs, also when it throws.
 struct CallbackScope {
-    explicit CallbackScope(bool& flag) : flag_(flag) { flag_ = true; }
+    explicit CallbackScope(std::atomic<bool>& flag) : flag_(flag) { flag_ = true; }
     ~CallbackScope() { flag_ = false; }
-    bool& flag_;
+    std::atomic<bool>& flag_;
 };
 
 }  // namespace
 
-int QvTranscodeRun::start() {
-    p_.logProgress = qv_registry()->getDbgOption("log_progress").isTrue();
-    // Lets the caller finish what it does after transcode() returns; a stop ends the wait.
-    if (p_.startDelay > 0) {
-        std::unique_lock guard(p_.lock);
-        p_.changed.wait_for(guard, std::chrono::milliseconds(p_.startDelay), [this] { return stopping(); });
-    }
-    const QvMuxer* muxer = p_.task->encoder()->getMuxer();
-    p_.checkDiscSpace = muxer && std::string_view(muxer->name()) == "asfmux";
-    int result = QvStatus::failed;
+// Runs a part of the work; what it throws ends it as a failure.
+template <class Work>
+int QvTranscodeRun::guarded(Work work) {
     try {
-        QVThreads::QvLowPriority lowered;
-        result = runPasses();
+        return work();
     } catch (const QvException& failure) {
         qv_dbg()->error("Transcoder: %s", failure.what());
     } catch (const std::exception& failure) {
         qv_dbg()->error("Transcoder: %s", failure.what());
+    } catch (...) {
+        qv_dbg()->error("Transcoder: a callback ended with an unknown exception");
+    }
+    return QvStatus::failed;
+}
+
+int QvTranscodeRun::start() {
+    p_.logProgress = qv_registry()->getDbgOption("log_progress").isTrue();
+    int result = QvStatus::ok;
+    {
+        QVThreads::QvLowPriority lowered;
+        // Lets the caller finish what it does after transcode() returns; a stop ends the wait.
+        if (p_.startDelay > 0) {
+            std::unique_lock guard(p_.lock);
+            p_.changed.wait_for(guard, std::chrono::milliseconds(p_.startDelay),
+                                [this] { return stopping(); });
+        }
+        const QvMuxer* muxer = p_.task->encoder()->getMuxer();
+        p_.checkDiscSpace = muxer && std::string_view(muxer->name()) == "asfmux";
+        result = guarded([this] { return runPasses(); });
+        if (p_.twoPass) forgetStatistics();
     }
     return finish(result);
 }
 
 int QvTranscodeRun::runPasses() {
-    int result = QvStatus::ok;
-    if (p_.twoPass) result = analyze();
-    if (result != QvStatus::ok) return result;
-    if (p_.twoPass && !stopping()) result = openEncoder();
-    if (result == QvStatus::ok && !(p_.twoPass && stopping())) result = mainLoop();
+    int result = p_.twoPass ? analyze() : QvStatus::ok;
+    if (result == QvStatus::ok && !stopping()) result = openEncoder();
+    if (result == QvStatus::ok && !stopping()) result = mainLoop();
     return result;
+}
+
+void QvTranscodeRun::giveUp() {
+    if (p_.closeEncoder) guarded([this] { return p_.task->encoder()->abort(); });
+    closeLinks(*p_.task);
+    qv_log()->setLogFile(Any());
 }
 
 // Closes the output: finished after a good or stopped run, aborted after an error.
@@ -67,46 +84,47 @@ int QvTranscodeRun::closeOutput(int result) {
     QvDbgLog& log = *qv_dbg();
     if (QvMuxer* muxer = pipe.getMuxer()) {
         log.info("[transcoder] Calling cbMuxClose()");
-        t_.cbMuxClose(muxer);
+        const int told = guarded([&] { return t_.cbMuxClose(muxer), QvStatus::ok; });
+        if (result == QvStatus::ok) result = told;
         log.info("[transcoder] cbMuxClose() returned");
     }
     log.info("[transcoder] closing encoding pipe");
     if (result != QvStatus::ok)
-        pipe.abort();
+        guarded([&] { return pipe.abort(); });
     else
-        result = pipe.close();
+        result = guarded([&] { return pipe.close(); });
     log.info("[transcoder] encoding pipe closed");
     return result;
 }
 
 int QvTranscodeRun::finish(int result) {
-    try {
-        if (p_.closeEncoder) result = closeOutput(result);
-    } catch (const QvException& failure) {
-        qv_dbg()->error("Transcoder: %s", failure.what());
-        result = QvStatus::failed;
-    }
+    // An input that ended early ends the run as a stop does; only cbDone tells.
+    const bool ended = endOfVideo_ && result == QvStatus::endOfStream;
+    if (ended) result = QvStatus::ok;
+    if (p_.closeEncoder) result = closeOutput(result);
     closeLinks(*p_.task);
     p_.metadataFiles.clear();
-    if (result != QvStatus::ok) t_.setError(QvStatus::failed, "Error in processing");
-    Any command;
-    if (result == QvStatus::ok && !stopping()) command = p_.task->currentPostprocessCommand();
-    const bool stopped = stopping();
-    qv_log()->setLogFile(Any());
-    p_.setState(QvTranscoder::connected);
-    int told = kStopped;
+    int told = ended ? QvStatus::endOfStream : kStopped;
     if (result != QvStatus::ok) {
+        t_.setError(QvStatus::failed, "Error in processing");
         told = result;
-    } else if (!stopped) {
-        told = QvStatus::ok;
-        if (command.isString()) {
-            t_.cbPostprocess(command);
-            told = execute_process(command);
-        }
     }
-    t_.cbDone(told);
-    p_.returnTask();
+    Any command;
+    const bool complete = result == QvStatus::ok && !stopping();
+    if (complete)
+        told = guarded([&] { return command = p_.task->currentPostprocessCommand(), QvStatus::ok; });
+    qv_log()->setLogFile(Any());
+    p_.endRun(QvTranscoder::connected);
+    // From here on the application may change the task.
+    if (complete && command.isString()) told = guarded([&] { return postprocess(command); });
+    guarded([&] { return t_.cbDone(told), QvStatus::ok; });
+    if (number_ == p_.runNumber) p_.returnTask();
     return result;
+}
+
+int QvTranscodeRun::postprocess(const Any& command) {
+    t_.cbPostprocess(command);
+    return execute_process(command);
 }
 
 // --- Main loop -------------------------------------------------------------------------------------
@@ -135,23 +153,15 @@ int QvTranscodeRun::mainLoop() {
         ++rounds_;
     } while (!allDone_);
     if (result_ == QvStatus::ok) checkDisc();
-    if (p_.twoPass) forgetStatistics();
-    if (!endOfVideo_ || result_ != QvStatus::endOfStream) return result_;
-    p_.stopRequested = false;  // the loop asked for it, nobody else
-    return QvStatus::ok;
+    return result_;
 }
 
 // The files of the first pass go with the run, so no encoder may keep pointing at them.
 void QvTranscodeRun::forgetStatistics() {
-    for (TransLink* video : video_) {
-        try {
-            p_.task->encoder()
-                ->videoEncoder(video->encStreamNr())
-                ->setParam("meta", Any(static_cast<const void*>(nullptr)));
-        } catch (const QvParamException&) {
-            // An encoder without statistics has nothing to forget.
-        }
-    }
+    const Any nothing(static_cast<const void*>(nullptr));
+    for (int i = 0; const TransLink* video = p_.task->getLink(1, i); ++i)
+        if (QvVideoEncoder* encoder = p_.task->encoder()->videoEncoder(video->encStreamNr()))
+            qvSetOptionalParam(*encoder, "meta", nothing);
 }
 
 void QvTranscodeRun::link(TransLink& link, int n) {
@@ -205,7 +215,7 @@ void QvTranscodeRun::waitWhilePaused() {
     guard.unlock();
     t_.cbPaused(true);
     guard.lock();
-    p_.changed.wait(guard, [this] { return !p_.paused; });
+    p_.changed.wait(guard, [this] { return !p_.paused || stopping(); });
     guard.unlock();
     t_.cbPaused(false);
 }
@@ -218,6 +228,10 @@ void QvTranscodeRun::report(QvProgressReport& progress) {
         stopLoop();
         return;
     }
+    callProgress(part);
+}
+
+void QvTranscodeRun::callProgress(double part) {
     CallbackScope inside(p_.inCallback);
     t_.cbProgress(part);
 }

@@ -5,6 +5,7 @@
 #include "core/encode/qvencodepipe.h"
 #include "core/encode/qvencoder.h"
 #include "core/encode/qvmuxer.h"
+#include "core/engine/optionalparam_p.h"
 #include "core/engine/qvexception.h"
 #include "core/engine/qvlog.h"
 #include "core/engine/qvregistry.h"
@@ -25,15 +26,6 @@ std::string narrow(const Any& value) {
     return text.isString() ? text.asString() : "";
 }
 
-// For parameters that a target may not know.
-void setOptional(QvCodec& target, const char* name, const Any& value) {
-    try {
-        target.setParam(name, value);
-    } catch (const QvParamException&) {
-        // It does not; then it does not need it either.
-    }
-}
-
 }  // namespace
 
 int QvTranscodeRun::open() {
@@ -52,6 +44,7 @@ int QvTranscodeRun::open() {
         copyMeta();
         if (!p_.twoPass) result = openEncoder();
         logSettings();
+        if (result != QvStatus::ok) copyPipeError(result);
     }
     if (result != QvStatus::ok) qv_log()->setLogFile(Any());
     return result != QvStatus::ok ? result : warning;
@@ -100,12 +93,13 @@ int QvTranscodeRun::openLinks() {
     AnyVector params;
     const auto links = p_.task->links();
     QvTask::makeOpenParams(*p_.task, links, params);
+    closeLinks(*p_.task);  // a run that could not start leaves some open
     for (int i = 0; i < links.size(); ++i) {
         TransLink& link = *links.at(i);
         int result = QvStatus::failed;
         try {
             result = link.open(&params.at(i).asDict());
-        } catch (const QvAssertFailure& failure) {
+        } catch (const QvAssertFailure&) {
             t_.setError(QvStatus::failed, "Can not open transcode link");
             throw;
         }
@@ -164,7 +158,7 @@ void QvTranscodeRun::setMuxerLength() {
     double rate = 0;
     const int total = totalFrames(*p_.task, rate);
     if (QvMuxer* muxer = p_.task->encoder()->getMuxer(); muxer && total > 0)
-        setOptional(*muxer, "_totalFrames", Any(total));
+        qvSetOptionalParam(*muxer, "_totalFrames", Any(total));
 }
 
 void QvTranscodeRun::copyMeta() {
@@ -174,13 +168,13 @@ void QvTranscodeRun::copyMeta() {
     if (!meta.isDict()) return;
     QvMuxer* muxer = p_.task->encoder()->getMuxer();
     QvVideoEncoder* encoder = p_.task->encoder()->videoEncoder(video->encStreamNr());
-    if (muxer) setOptional(*muxer, "meta", meta);
+    if (muxer) qvSetOptionalParam(*muxer, "meta", meta);
     const Any start = meta.asDict().get("startTimecode");
     const Any rate = encoder ? encoder->QvCodec::getParam("framerate") : Any();
     if (!start.isString() || !rate.isFramerate()) return;
     const Any offset(QvTimecode(start.asString()).frameNr(rate.asFramerate(), false));
-    setOptional(*encoder, "timecodeOffset", offset);
-    if (muxer) setOptional(*muxer, "timecodeOffset", offset);
+    qvSetOptionalParam(*encoder, "timecodeOffset", offset);
+    if (muxer) qvSetOptionalParam(*muxer, "timecodeOffset", offset);
 }
 
 int QvTranscodeRun::openEncoder() {
@@ -189,7 +183,13 @@ int QvTranscodeRun::openEncoder() {
     const int result = pipe.open();
     if (result == QvStatus::ok) return result;
     closeLinks(*p_.task);
-    return t_.setError(pipe.errorCode() ? pipe.errorCode() : result, "%s", pipe.errorDesc());
+    return pipe.errorCode() ? pipe.errorCode() : result;
+}
+
+// The pipe has logged it.
+void QvTranscodeRun::copyPipeError(int code) {
+    p_.errorCode = code;
+    p_.errorText = p_.task->encoder()->errorDesc();
 }
 
 void QvTranscodeRun::logSettings() const {

@@ -99,8 +99,8 @@ int QvTask::checkMultiView() {
                 required);
         if (given > required)
             qv_dbg()->warning(
-                "Source contains %d views and encoder requires %d views, views above %d will be discarded.",
-                given, required, required);
+                "Source contains %d views and encoder requires %d, views above %d will be discarded.", given,
+                required, required);
     }
     return QvStatus::ok;
 }
@@ -128,7 +128,7 @@ int QvTask::checkDolbyPassthrough(TransLink& link, int smartRender, AnyVector& m
     int verdict = QvStatus::ok;
     if (!params.isDict()) {
         text = "Decoder does not support smart rendering";
-        verdict = params.isInt32() ? params.asInt32() : QvStatus::failed;
+        verdict = params.asInt32(QvStatus::ok);  // the decoder's own answer, if it gave one
     } else {
         const AnyDict& own = link.processParams();
         const std::string filters = soundFilters(own.isSet("filters") ? own : processParams(2));

@@ -5,8 +5,9 @@
 #include "core/decode/decodefactory.h"
 #include "core/decode/qvdecoder.h"
 #include "core/encode/qvencodepipe.h"
-#include "core/engine/qvutil.h"
+#include "core/engine/qvexception.h"
 #include "core/engine/qvlog.h"
+#include "core/engine/qvutil.h"
 #include "core/engine/status.h"
 #include "core/transcode/qvtranscodetask.h"
 #include "core/transcode/translink.h"
@@ -37,6 +38,18 @@ AnyDict storedProcessParams(const AnyVector& streams, int type, int number) {
         return sources.at(0).asDict().getDict("process", AnyDict());
     }
     return AnyDict();
+}
+
+// Null when it can't be opened, also because its settings are of a decoder that is not installed.
+QvDecodePipe* openInput(const AnyDict& file, QvFileOpenCb* callback) {
+    const AnyDict settings = file.getDict("decoder", AnyDict());
+    if (!settings.get("name").isString())
+        return QvDecFactory::decodePipe(file.get("filename"), Any(), callback, nullptr);
+    try {
+        return QvDecFactory::restoreDecoder(file.get("filename"), settings, callback);
+    } catch (const QvAssertFailure&) {
+        return nullptr;
+    }
 }
 
 void removeSurplusStreams(QvEncodePipe& pipe, int type, int wanted) {
@@ -96,13 +109,8 @@ int QvTask::openInputs(const AnyVector& files, QvDPipeList& opened, QvFileOpenCb
     for (int i = 0; i < files.size(); ++i) {
         if (!files.at(i).isDict()) continue;
         const AnyDict& file = files.at(i).asDict();
-        const AnyDict settings = file.getDict("decoder", AnyDict());
-        QvDecodePipe* decoder =
-            settings.get("name").isString()
-                ? QvDecFactory::restoreDecoder(file.get("filename"), settings, callback)
-                : QvDecFactory::decodePipe(file.get("filename"), Any(), callback, nullptr);
         Any name;
-        if (decoder)
+        if (QvDecodePipe* decoder = openInput(file, callback))
             opened.append(decoder);
         else
             qv_dbg()->warning("Task.restore: failed to open %s", printable(file.get("filename"), name));
@@ -118,16 +126,16 @@ int QvTask::restore(const AnyDict& state, QvDPipeList& decoders, QvEncodePipe** 
         QV_FAIL(errorDesc());
     }
     const Any& settings = state.get("encoder");
-    const bool hasStreams = settings.isDict() && settings.asDict().get("streams").isVector() &&
-                            !settings.asDict().get("streams").asVector().empty();
+    const AnyVector streams = state.getVector("streams", AnyVector());
+    const char* noStreams = "Task.restore: Invalid task state structure - no output streams";
+    if (streams.empty()) return setError(QvStatus::invalidStructure, "%s", noStreams);
     if (!settings.isDict() || settings.asDict().empty()) {
         QvUtil::debugOutDict(state);
         return setError(QvStatus::invalidStructure,
                         "Task.restore: Invalid task state structure - missing encoder settings");
     }
-    if (!hasStreams)
-        return setError(QvStatus::invalidStructure,
-                        "Task.restore: Invalid task state structure - no output streams");
+    if (settings.asDict().getVector("streams", AnyVector()).empty())
+        return setError(QvStatus::invalidStructure, "%s", noStreams);
     std::unique_ptr<QvEncodePipe> pipe(QvEncodePipe::create());
     QV_ASSERT_MSG(pipe, "Task.restore: could not create EncodePipe");
     if (const int result = pipe->restore(settings.asDict()); result != QvStatus::ok)
@@ -143,7 +151,6 @@ int QvTask::restore(const AnyDict& state, QvDPipeList& decoders, QvEncodePipe** 
     for (int i = 0; i < opened.size(); ++i) decoders.append(opened.at(i));
     encoder_ = pipe.get();
     ForgetEncoder forget{*this};  // the pipe goes with a failure, so nothing may point to it
-    const AnyVector streams = state.getVector("streams", AnyVector());
     for (int i = 0; i < pipe->nrStreams(); ++i) {
         const AnyDict entry = streams.at(i).isDict() ? streams.at(i).asDict() : AnyDict();
         if (const int result = linkStoredStream(entry, i, decoders); result < 0) return result;
@@ -200,8 +207,7 @@ QvTask* QvTask::fromStateWithSource(const AnyDict& state, QvDecodePipe* decoder,
     std::unique_ptr<QvEncodePipe> pipe(QvEncodePipe::create());
     QV_ASSERT_MSG(pipe, "Task.restore: could not create EncodePipe");
     if (pipe->restore(state.getDict("encoder", AnyDict())) != QvStatus::ok) return nullptr;
-    for (int type : {1, 2})
-        if (decoder->nrStreams(type) > 0) removeSurplusStreams(*pipe, type, decoder->nrStreams(type));
+    for (int type : {1, 2}) removeSurplusStreams(*pipe, type, decoder->nrStreams(type));
     auto task = std::make_unique<QvTask>();
     task->setEncoder(pipe.get());
     const AnyVector streams = state.getVector("streams", AnyVector());

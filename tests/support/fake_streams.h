@@ -54,6 +54,7 @@ class FakeDecoder : public QvDecodePipe {
         return 0;
     }
     int seekToFrame(long long frame, int) override {
+        if (seekResult != 0) return seekResult;
         next = static_cast<int>(frame);
         return 0;
     }
@@ -122,6 +123,7 @@ class FakeDecoder : public QvDecodePipe {
     int read = 0;
     int truncatedAt = -1;
     int failAt = -1;
+    int seekResult = 0;
     int captionEvery = 0;
     bool isOn = true;
 };
@@ -228,8 +230,16 @@ class FakeEncodePipe : public QvEncodePipe {
     int nrStreams(int mask) const override {
         return (mask & 1 ? videoStreams : 0) + (mask & 2 ? static_cast<int>(audios.size()) : 0);
     }
-    QvOStream* stream(int, int) const override { return nullptr; }
-    QvOStream* streamAt(int) const override { return nullptr; }
+    QvOStream* stream(int type, int nr) const override {
+        return nr < 0 || nr >= nrStreams(type) ? nullptr : streamAt(type == 1 ? nr : videoStreams + nr);
+    }
+    QvOStream* streamAt(int index) const override {
+        while (static_cast<int>(records.size()) <= index) {
+            const bool isVideo = static_cast<int>(records.size()) < videoStreams;
+            records.push_back(std::make_unique<QvOStream>(isVideo ? 1 : 2));
+        }
+        return records.at(static_cast<std::size_t>(index)).get();
+    }
     TPtrList<QvOStream> streams(int) const override { return {}; }
     int indexOf(QvOStream*) const override { return -1; }
     int streamNr(QvOStream*) const override { return -1; }
@@ -259,4 +269,7 @@ class FakeEncodePipe : public QvEncodePipe {
     AnyDict set;
     QvMuxer* muxer = nullptr;
     int videoStreams = 1;
+
+  private:
+    mutable std::vector<std::unique_ptr<QvOStream>> records;
 };

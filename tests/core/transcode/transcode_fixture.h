@@ -1,0 +1,153 @@
+// A transcoder over fakes that writes down what happens, in order.
+#pragma once
+
+#include <atomic>
+#include <condition_variable>
+#include <cstdio>
+#include <functional>
+#include <mutex>
+#include <string>
+#include <vector>
+
+#include "core/engine/qvexception.h"
+#include "core/transcode/qvtranscoder.h"
+#include "core/transcode/qvtranscodetask.h"
+#include "tests/support/fake_streams.h"
+
+// The text of the assertion that `work` ends with; "" if it ends well.
+template <class Work>
+std::string assertion(Work work) {
+    try {
+        work();
+    } catch (const QvAssertFailure& failure) {
+        const std::string text = failure.what();
+        return text.substr(text.rfind('\n') + 1);
+    }
+    return "";
+}
+
+class Events {
+  public:
+    void add(const std::string& text) {
+        const std::lock_guard guard(lock_);
+        all_ += (all_.empty() ? "" : " ") + text;
+        changed_.notify_all();
+    }
+    std::string take() {
+        const std::lock_guard guard(lock_);
+        return std::exchange(all_, "");
+    }
+    void waitFor(const std::string& text) {
+        std::unique_lock guard(lock_);
+        changed_.wait(guard, [&] { return all_.find(text) != std::string::npos; });
+    }
+
+  private:
+    std::mutex lock_;
+    std::condition_variable changed_;
+    std::string all_;
+};
+
+class NotedAudio : public FakeAudioEncoder {
+  public:
+    explicit NotedAudio(Events& events) : events_(events) {}
+    int writePcm(QvPcm* pcm, int samples) override {
+        if (!quiet) events_.add("a" + std::to_string(samples < 0 ? pcm->samples() : samples));
+        return FakeAudioEncoder::writePcm(pcm, samples);
+    }
+    bool quiet = false;
+
+  private:
+    Events& events_;
+};
+
+class NotedPipe : public FakeEncodePipe {
+  public:
+    NotedPipe(Events& events, const QvFramerate& rate) : FakeEncodePipe(rate), events_(events) {
+        audio(48000);
+        auto noted = std::make_unique<NotedAudio>(events);
+        sound = noted.get();
+        noted->params = audios[0]->params;
+        audios[0] = std::move(noted);
+    }
+    int open() override { return note("open", openResult); }
+    int close() override { return note("close", closeResult); }
+    int abort() override { return note("abort", 0); }
+    int writeFrame(QvFrame* frame, int stream) override {
+        if (quiet) return FakeEncodePipe::writeFrame(frame, stream);
+        return note("v" + std::to_string(frame->frameNr), FakeEncodePipe::writeFrame(frame, stream));
+    }
+    void getParam(const char* name, Any& value) const override {
+        if (std::string(name) == "filename")
+            value = filename;
+        else
+            FakeEncodePipe::getParam(name, value);
+    }
+
+    int openResult = 0, closeResult = 0;
+    bool quiet = false;
+    NotedAudio* sound = nullptr;
+    Any filename;
+
+  private:
+    int note(const std::string& what, int result) {
+        events_.add(what);
+        return result ? setError(result, "%s failed", what.c_str()) : 0;
+    }
+    Events& events_;
+};
+
+class NotedTranscoder : public QvTranscoder {
+  public:
+    explicit NotedTranscoder(Events& events, QvTask* task = nullptr) : QvTranscoder(task), events_(events) {
+        setParam("startDelay", 0);
+    }
+    ~NotedTranscoder() override { stop(); }
+
+    void cbDone(int result) override {
+        events_.add("done" + std::to_string(result));
+        if (onDone) onDone();
+    }
+    int cbProgress(double part) override {
+        char text[16];
+        std::snprintf(text, sizeof text, "%.2f", part);
+        events_.add(text);
+        return 0;
+    }
+    void cbPaused(bool paused) override { events_.add(paused ? "paused" : "resumed"); }
+    int cbProcess() override {
+        ++rounds;
+        return onProcess ? onProcess() : 0;
+    }
+    void cbPostprocess(const Any& command) override {
+        events_.add(std::string("post:") + command.asString());
+    }
+    int cbMuxClose(QvMuxer*) override {
+        events_.add("muxclose");
+        return 0;
+    }
+
+    std::function<int()> onProcess;
+    std::function<void()> onDone;
+    std::atomic<int> rounds{0};
+
+  private:
+    Events& events_;
+};
+
+// `frames` of 25 a second with 48 kHz sound. Sources, output and task outlive the transcoder.
+struct Job {
+    explicit Job(int frames = 2) : decoder(frames, QvFramerate::f25p()), pipe(events, QvFramerate::f25p()) {
+        decoder.audio(frames * 1920LL, 48000);
+        task.setEncoder(&pipe);
+    }
+    void linkBoth() {
+        ASSERT_EQ(task.link(&decoder, 1, 0, 0), 0);
+        ASSERT_EQ(task.link(&decoder, 2, 0, 0), 1);
+    }
+
+    Events events;
+    FakeDecoder decoder;
+    NotedPipe pipe;
+    QvTask task;
+};
