@@ -26,6 +26,11 @@ file(CONFIGURE OUTPUT ${CMAKE_BINARY_DIR}/include/qvplugcore/qvplugcore.h CONTEN
 
 add_library(qvplugcore SHARED $<TARGET_OBJECTS:qv_objects>)
 target_link_libraries(qvplugcore PRIVATE qv_objects)
+# Instances of the standard library's templates are visible by their own declaration; they are not ours to export.
+if(NOT QV_SANITIZE)
+  target_link_options(qvplugcore PRIVATE -Wl,--version-script=${CMAKE_SOURCE_DIR}/cmake/exports.map -Wl,--no-undefined)
+  set_target_properties(qvplugcore PROPERTIES LINK_DEPENDS ${CMAKE_SOURCE_DIR}/cmake/exports.map)
+endif()
 set_target_properties(qvplugcore PROPERTIES VERSION ${PROJECT_VERSION} SOVERSION ${PROJECT_VERSION_MAJOR})
 target_include_directories(qvplugcore INTERFACE
   $<BUILD_INTERFACE:${CMAKE_SOURCE_DIR}> $<BUILD_INTERFACE:${CMAKE_BINARY_DIR}/include>
