@@ -1,0 +1,22 @@
+// The two text formats, line by line.
+#pragma once
+
+#include <functional>
+#include <string>
+#include <string_view>
+
+#include "core/media/qvgeometry.h"
+
+struct ParsedSubtitle {
+    MediaTime start;
+    MediaTime end;
+    std::string text;  // lines separated by "|"
+};
+
+using SubtitleTaker = std::function<void(ParsedSubtitle&&)>;
+
+// "{first}{last}line|line": gives each entry to `take`. 0, or -1 at a malformed line, which ends it.
+int parseSub(std::string_view text, const QvFramerate& rate, const SubtitleTaker& take);
+
+// Number, times and lines of text, up to an empty line. A number without times ends it.
+void parseSrt(std::string_view text, const SubtitleTaker& take);

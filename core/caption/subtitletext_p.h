@@ -1,0 +1,35 @@
+// The text of a subtitle file, freed of its byte order mark.
+#pragma once
+
+#include <cstddef>
+#include <memory>
+#include <string>
+#include <string_view>
+
+class Any;
+
+// A file's bytes with four zeros behind them.
+class SubtitleBytes {
+  public:
+    // 0, or -1 (no memory is told in the debug log).
+    int read(const Any& filename);
+    std::string_view view() const { return {memory_.get(), size_}; }
+
+  private:
+    struct Release {
+        void operator()(char* memory) const;
+    };
+    std::unique_ptr<char, Release> memory_;
+    std::size_t size_ = 0;
+};
+
+struct SubtitleMark {
+    int encoding = 0;      // QvSubtitles::Encoding
+    std::size_t size = 0;  // bytes
+};
+SubtitleMark findMark(std::string_view bytes);
+
+// The text behind the mark as UTF-8 (or as it stands, in an encoding that the file does not tell), with line
+// feeds only where the file uses carriage returns alone. A unit of several bytes is taken in this machine's
+// order, or with its bytes `swapped`. No more than `bytes` less two marks is kept of such a text.
+std::string subtitleText(std::string_view bytes, const SubtitleMark& mark, bool swapped);
