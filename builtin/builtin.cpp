@@ -37,7 +37,7 @@ constexpr QvBuiltinRow registered[] = {
     {"bobber",       videoFilter,  "Auto bob",                       "Auto bob",                   nullptr},
     {"cropper",      videoFilter,  "Crop filter",                    "Crop/pad",                   nullptr},
     {"timecode",     videoFilter,  "Timecode inserter",              "Timecode",                   nullptr},
-    {"subimport",    decoder,      "Text subtitle importer",         "Subtitle import",            nullptr,
+    {"subimport",    decoder,      "Text subtitle importer",         "Subtitle import",            newSubimport,
      {.exts = "sub srt", .priority = 10}},
     {"testgen",      decoder,      "Test stream generator",          "Test input",                 newTestgen,
      {.exts = "", .priority = 10, .skipAuto = true, .internal = true}},

@@ -8,6 +8,7 @@ class QvCodec;
 
 QvCodec* newRawdec();
 QvCodec* newTestgen();
+QvCodec* newSubimport();
 QvCodec* newWavdec();
 QvCodec* newSccdec();
 QvCodec* newFilesink();

@@ -32,6 +32,11 @@ bool isText(std::string_view text) {
     return text.find_first_not_of('\0', std::min(text.find('\0'), text.size())) == text.npos;
 }
 
+std::string textOf(const QvSubtitle& entry) {
+    const Any narrow = entry.text.isWString() ? entry.text.toString() : entry.text;
+    return narrow.asString("");
+}
+
 Any textValue(const std::string& text) { return text.empty() ? Any("") : Any(text.c_str()); }
 
 // --- Writing.
@@ -46,12 +51,12 @@ std::string clock(const MediaTime& time) {
 
 void putSub(std::string& out, const QvSubtitle& entry, const QvFramerate& rate) {
     const auto frame = [&rate](const MediaTime& time) { return std::to_string(time.position(rate)); };
-    out += "{" + frame(entry.start) + "}{" + frame(entry.end) + "}" + entry.text.asString("") + "\r\n";
+    out += "{" + frame(entry.start) + "}{" + frame(entry.end) + "}" + textOf(entry) + "\r\n";
 }
 
 void putSrt(std::string& out, const QvSubtitle& entry, int number) {
     out += std::to_string(number) + "\r\n" + clock(entry.start) + " --> " + clock(entry.end) + "\r\n";
-    std::string lines = entry.text.asString("");
+    std::string lines = textOf(entry);
     for (std::size_t at = 0; (at = lines.find('|', at)) != lines.npos; at += 2) lines.replace(at, 1, "\r\n");
     out += lines + "\r\n\r\n";
 }
@@ -78,6 +83,7 @@ int QvSubtitles::parseFile(const Any& filename, const QvFramerate& rate) {
     entries_.clear();
     lastFound_ = 0;
     encoding_ = markNone;
+    unread_ = 0;
     const int format = formatOf(filename);
     if (format == 0) return QvStatus::failed;
     format_ = static_cast<Format>(format);
@@ -86,17 +92,19 @@ int QvSubtitles::parseFile(const Any& filename, const QvFramerate& rate) {
     if (file.read(filename) != QvStatus::ok) return QvStatus::failed;
     const SubtitleMark mark = findMark(file.view());
     encoding_ = static_cast<Encoding>(mark.encoding);
-    int status = parse(subtitleText(file.view(), mark, false));
+    const std::size_t bound = subtitleBound(file.view(), mark);
+    int status = parse(subtitleText(file.view(), mark, false), bound);
     // The mark of the other byte order is honoured where this machine's order says nothing.
     if (entries_.empty() && (encoding_ == markUtf16be || encoding_ == markUtf32be)) {
         format_ = static_cast<Format>(format);
-        status = parse(subtitleText(file.view(), mark, true));
+        status = parse(subtitleText(file.view(), mark, true), bound);
     }
     for (const auto& entry : entries_) maxRows_ = std::max(maxRows_, entry->rows);
     return status;
 }
 
-int QvSubtitles::parse(std::string_view text) {
+int QvSubtitles::parse(std::string_view text, std::size_t bound) {
+    unread_ = 0;
     if (!isText(text)) return QvStatus::failed;
     const auto take = [this](ParsedSubtitle&& parsed) {
         auto entry = std::make_unique<QvSubtitle>();
@@ -106,12 +114,15 @@ int QvSubtitles::parse(std::string_view text) {
         entry->end = parsed.end;
         entries_.push_back(std::move(entry));
     };
+    const std::size_t beyond = text.size() - std::min(text.size(), bound);
+    text.remove_suffix(beyond);
+    unread_ = static_cast<long long>(beyond);
     if (format_ == SUB) {
         const int status = parseSub(text, rate_, take);
         if (!entries_.empty()) return status;
         format_ = SRT;
     }
-    parseSrt(text, take);
+    unread_ += static_cast<long long>(parseSrt(text, take));
     return QvStatus::ok;
 }
 
@@ -168,7 +179,7 @@ int QvSubtitles::search(const MediaTime& time) {
 }
 
 void QvSubtitles::changeFramerate(const QvFramerate& rate) {
-    if (!(rate.rate() == rate_.rate())) {
+    if (!(QvFramerate(rate.rate()) == QvFramerate(rate_.rate()))) {
         for (const auto& entry : entries_)
             for (MediaTime* time : {&entry->start, &entry->end})
                 *time = MediaTime(time->position(rate_), rate, timescale);

@@ -60,15 +60,20 @@ class QV_API QvSubtitles {
     Encoding encoding() const { return encoding_; }
     int maxRows() const { return maxRows_; }  // of all entries; 0 without any
 
+    // Bytes of text, as UTF-8, behind the place where parseFile stopped: in an SRT file at a number that no
+    // times follow, in UTF-16 and UTF-32 where the text becomes longer than the file. 0: all was read.
+    long long unread() const { return unread_; }
+
   private:
     std::vector<std::unique_ptr<QvSubtitle>> entries_;
     Format format_ = SRT;
     Encoding encoding_ = markNone;
     int maxRows_ = 0;
     int lastFound_ = 0;
+    long long unread_ = 0;
     QvFramerate rate_;
 
-    int parse(std::string_view text);
+    int parse(std::string_view text, std::size_t bound);
     bool hit(int index, const MediaTime& time);
     int search(const MediaTime& time);
 };

@@ -139,15 +139,16 @@ int parseSub(std::string_view text, const QvFramerate& rate, const SubtitleTaker
     return status == QvStatus::endOfStream ? QvStatus::ok : status;
 }
 
-void parseSrt(std::string_view text, const SubtitleTaker& take) {
+std::size_t parseSrt(std::string_view text, const SubtitleTaker& take) {
     Lines lines(text);
     while (!lines.atEnd()) {
         View line = lines.next();
         if (line.empty()) continue;
         if (!isTimesLine(line)) {
             if (number(line) == 0) continue;
+            const std::size_t left = lines.rest().size();
             line = lines.next();
-            if (!isTimesLine(line)) return;
+            if (!isTimesLine(line)) return left;
         }
         const auto times = readTimes(line);
         if (!times) continue;
@@ -155,4 +156,5 @@ void parseSrt(std::string_view text, const SubtitleTaker& take) {
         if (times->subViewer) breakSubViewerLines(entry.text);
         take(std::move(entry));
     }
+    return 0;
 }

@@ -1,6 +1,7 @@
 // The two text formats, line by line.
 #pragma once
 
+#include <cstddef>
 #include <functional>
 #include <string>
 #include <string_view>
@@ -19,4 +20,5 @@ using SubtitleTaker = std::function<void(ParsedSubtitle&&)>;
 int parseSub(std::string_view text, const QvFramerate& rate, const SubtitleTaker& take);
 
 // Number, times and lines of text, up to an empty line. A number without times ends it.
-void parseSrt(std::string_view text, const SubtitleTaker& take);
+// Returns the bytes of text from there on, 0 if all was read.
+std::size_t parseSrt(std::string_view text, const SubtitleTaker& take);

@@ -37,19 +37,13 @@ std::string swappedUnits(std::string_view bytes, std::size_t unit) {
     return out;
 }
 
-std::string converted(std::string_view bytes, const SubtitleMark& mark, bool swapped) {
-    const bool wide = mark.encoding >= QvSubtitles::markUtf32be;
-    const int encoding = wide ? QvText::utf32 : QvText::utf16;
-    std::string text = swapped ? QvText::toUtf8(QvText::toUtf32(swappedUnits(bytes, wide ? 4 : 2), encoding))
-                               : QvText::toUtf8(QvText::toUtf32(bytes, encoding));
-    const std::size_t bound = bytes.size() > mark.size ? bytes.size() - mark.size : 0;
-    if (text.size() > bound) {
-        qv_log()->warning("Subtitles: the last %lld of %lld bytes of text are beyond the bound of the file",
-                          static_cast<long long>(text.size() - bound), static_cast<long long>(text.size()));
-        text.resize(bound);
-    }
-    return text;
+std::string converted(std::string_view bytes, int encoding, bool swapped) {
+    const bool wide = encoding >= QvSubtitles::markUtf32be;
+    const std::string units = swapped ? swappedUnits(bytes, wide ? 4 : 2) : std::string(bytes);
+    return QvText::toUtf8(QvText::toUtf32(units, wide ? QvText::utf32 : QvText::utf16));
 }
+
+bool hasUnits(const SubtitleMark& mark) { return mark.encoding >= QvSubtitles::markUtf16be; }
 
 }  // namespace
 
@@ -84,8 +78,13 @@ SubtitleMark findMark(std::string_view bytes) {
 
 std::string subtitleText(std::string_view bytes, const SubtitleMark& mark, bool swapped) {
     bytes.remove_prefix(mark.size);
-    const bool units = mark.encoding >= QvSubtitles::markUtf16be;
-    std::string text = units ? converted(bytes, mark, swapped) : std::string(bytes);
+    std::string text = hasUnits(mark) ? converted(bytes, mark.encoding, swapped) : std::string(bytes);
     if (endsLinesWithCr(text)) std::replace(text.begin(), text.end(), '\r', '\n');
     return text;
+}
+
+std::size_t subtitleBound(std::string_view bytes, const SubtitleMark& mark) {
+    // The bytes of the file stay the measure of a text that was converted, less the mark once more.
+    const std::size_t marks = hasUnits(mark) ? 2 * mark.size : mark.size;
+    return bytes.size() > marks ? bytes.size() - marks : 0;
 }

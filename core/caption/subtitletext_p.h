@@ -30,6 +30,9 @@ struct SubtitleMark {
 SubtitleMark findMark(std::string_view bytes);
 
 // The text behind the mark as UTF-8 (or as it stands, in an encoding that the file does not tell), with line
-// feeds only where the file uses carriage returns alone. A unit of several bytes is taken in this machine's
-// order, or with its bytes `swapped`. No more than `bytes` less two marks is kept of such a text.
+// feeds where the file uses carriage returns alone. A unit of several bytes is taken in this machine's order,
+// or with its bytes `swapped`.
 std::string subtitleText(std::string_view bytes, const SubtitleMark& mark, bool swapped);
+
+// How much of such a text is read at most.
+std::size_t subtitleBound(std::string_view bytes, const SubtitleMark& mark);
