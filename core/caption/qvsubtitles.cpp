@@ -20,7 +20,7 @@ bool spans(const QvSubtitle& entry, const MediaTime& time) {
 }
 
 int formatOf(const Any& filename) {
-    const Any ext = QvFile::getExt(filename, true);
+    const Any ext = filename.isText() ? QvFile::getExt(filename, true) : Any();
     if (ext == "srt") return QvSubtitles::SRT;
     if (ext == "sub") return QvSubtitles::SUB;
     qv_dbg()->error("Error: Unsupported subtitle format %s", ext.asString(""));

@@ -1,0 +1,241 @@
+#include "core/caption/qvsubtitles.h"
+
+#include <gtest/gtest.h>
+
+#include <string>
+
+#include "core/engine/qvexception.h"
+#include "tests/support/log_capture.h"
+#include "tests/support/platform_scope.h"
+#include "tests/support/temp_folder.h"
+
+namespace {
+
+using namespace std::string_literals;
+
+const QvFramerate pal{25.0};
+
+class Subtitles : public testing::Test {
+  protected:
+    int parse(const char* name, const std::string& bytes) {
+        return subtitles.parseFile(folder.write(name, bytes).c_str(), pal);
+    }
+    // "start-end text" of each entry, times in milliseconds.
+    std::string entries() const {
+        std::string all;
+        for (int i = 0; i < subtitles.nrSubtitles(); ++i) {
+            const QvSubtitle& s = *subtitles.at(i);
+            all += std::to_string(s.start.ms()) + "-" + std::to_string(s.end.ms()) + " " +
+                   s.text.asString("?") + "\n";
+        }
+        return all;
+    }
+
+    TempFolder folder;
+    QvSubtitles subtitles;
+};
+
+std::string utf16(const std::u16string& text, bool bigEndian) {
+    std::string bytes;
+    for (const char16_t c : text) {
+        const char low = static_cast<char>(c & 255), high = static_cast<char>(c >> 8);
+        bytes += bigEndian ? high : low;
+        bytes += bigEndian ? low : high;
+    }
+    return bytes;
+}
+
+TEST_F(Subtitles, SrtFiles) {
+    const struct {
+        const char* what;
+        std::string bytes;
+        std::string expected;
+    } cases[] = {
+        {"three lines", "1\n00:00:01,500 --> 00:00:02,000\na\nb\nc\n\n", "1500-2000 a|b|c\n"},
+        {"carriage returns", "1\r\n01:02:03,004 --> 01:02:04,005\r\na\r\nb\r\n\r\n2\r\n",
+         "3723004-3724005 a|b\n"},
+        {"carriage returns twice", "1\r\r\n00:00:01,000 --> 00:00:02,000\r\r\na\r\r\nb\r\r\n",
+         "1000-2000 a|b\n"},
+        {"carriage returns only",
+         "1\r00:00:01,000 --> 00:00:02,000\ra\rb\r\r00:00:03,000 --> 00:00:04,000\rc\r",
+         "1000-2000 a|b\n3000-4000 c\n"},
+        {"a mark",
+         "\xEF\xBB\xBF"
+         "1\n00:00:01,000 --> 00:00:02,000\na\n",
+         "1000-2000 a\n"},
+        {"no text line", "1\n00:00:01,000 --> 00:00:02,000\n\n2\n00:00:03,000 --> 00:00:04,000\nb",
+         "1000-2000 \n3000-4000 b\n"},
+        {"no numbers", "00:00:01,000 --> 00:00:02,000\na\n\n00:00:03,000 --> 00:00:04,000\nb\n",
+         "1000-2000 a\n3000-4000 b\n"},
+        {"rubbish around", "hello\n\n[x]\n1\n00:00:01,000 --> 00:00:02,000\na\n", "1000-2000 a\n"},
+        {"places behind the times", "1\n00:00:01,000 --> 00:00:02,000  X1:40 X2:600\na\n", "1000-2000 a\n"},
+        {"short of digits", "1\n00:00:01 --> 00:00:02\na\n\n2\n00:00:03,5-->00:00:04,5\nb\n",
+         "1000-2000 a\n3005-4005 b\n"},
+        {"comma between the times", "00:00:01.000,00:00:02.000\na[br]b\n\n", "1000-2000 a|b\n"},
+        {"letters for digits", "1\nxx:yy:zz,www --> 00:00:02,000\na\n", "0-2000 a\n"},
+        {"times without an end", "1\n00:00:01,000\n00:00:03,000 --> 00:00:04,000\nb\n", "3000-4000 b\n"},
+        {"great numbers", "99999999999999999999\n99:99:99,99999999999999999999 --> 00:00:01,000\na\n",
+         std::to_string(((99 * 60 + 99) * 60 + 99) * 1000LL + 2147483647LL) + "-1000 a\n"},
+        {"nothing", "", ""},
+        {"blank", "\n\r\n \n", ""},
+    };
+    for (const auto& c : cases) {
+        EXPECT_EQ(parse("a.srt", c.bytes), 0) << c.what;
+        EXPECT_EQ(entries(), c.expected) << c.what;
+        EXPECT_EQ(subtitles.unread(), 0) << c.what;
+    }
+}
+
+TEST_F(Subtitles, ANumberWithoutTimesEndsAFileAndIsTold) {
+    const std::string rest = "7 dwarfs\n\n3\n00:00:05,000 --> 00:00:06,000\nlost\n";
+    EXPECT_EQ(parse("a.srt", "1\n00:00:01,000 --> 00:00:02,000\na\n\n" + rest), 0);
+    EXPECT_EQ(entries(), "1000-2000 a\n");
+    EXPECT_EQ(subtitles.unread(), static_cast<long long>(rest.size() - std::string("7 dwarfs\n").size()));
+}
+
+TEST_F(Subtitles, SubFiles) {
+    const struct {
+        const char* what;
+        std::string bytes;
+        int status;
+        int format;
+        std::string expected;
+    } cases[] = {
+        {"two lines", "{10}{20}Line one|Line two\r\n{25}{50}{y:i}b", 0, 2,
+         "400-800 Line one|Line two\n1000-2000 {y:i}b\n"},
+        {"carriage return behind", "{10}{20}a\n\r\r{30}{40}b\n", 0, 2, "400-800 a\n1200-1600 b\n"},
+        {"carriage return only", "{10}{20}a\r{30}{40}b\r", 0, 2, "400-800 a\n1200-1600 b\n"},
+        {"no number", "{x}{}a\n", 0, 2, "0-0 a\n"},
+        {"a brace is open", "{10}{20}a\n{30", -1, 2, "400-800 a\n"},
+        {"a long number", "{10}{20}a\n{12345678901234567}{1}b\n", -1, 2, "400-800 a\n"},
+        {"the longest number", "{0000000000000025}{50}b\n", 0, 2, "1000-2000 b\n"},
+        {"one brace", "{10}{20}a\n{30}b\n", 0, 2, "400-800 a\n"},
+        {"text between", "{10}{20}a\nwords\n{30}{40}b", 0, 2, "400-800 a\n1200-1600 b\n"},
+        {"SRT in disguise", "1\n00:00:01,000 --> 00:00:02,000\na\n", 0, 1, "1000-2000 a\n"},
+        {"nothing", "", 0, 1, ""},
+    };
+    for (const auto& c : cases) {
+        EXPECT_EQ(parse("a.SUB", c.bytes), c.status) << c.what;
+        EXPECT_EQ(subtitles.format(), c.format) << c.what;
+        EXPECT_EQ(entries(), c.expected) << c.what;
+    }
+}
+
+TEST_F(Subtitles, RowsAreCounted) {
+    parse("a.sub", "{1}{2}a|b||\n{3}{4}c\n");
+    EXPECT_EQ(subtitles.at(0)->rows, 4);
+    EXPECT_EQ(subtitles.at(1)->rows, 1);
+    EXPECT_EQ(subtitles.maxRows(), 4);
+    EXPECT_EQ(subtitles.at(0)->position, QvPoint(-1, -1));
+    EXPECT_THROW(subtitles.at(2), QvAssertFailure);
+    EXPECT_THROW(subtitles.at(-1), QvAssertFailure);
+}
+
+TEST_F(Subtitles, MarksTellTheEncoding) {
+    const std::u16string text = u"1\r\n00:00:01,000 --> 00:00:02,000\r\n\u00C4\u20AC\r\n";
+    std::string wide = "\xFF\xFE\0\0"s, wideSwapped = "\0\0\xFE\xFF"s;
+    for (const char16_t c : text) {
+        wide += {static_cast<char>(c & 255), static_cast<char>(c >> 8), '\0', '\0'};
+        wideSwapped += {'\0', '\0', static_cast<char>(c >> 8), static_cast<char>(c & 255)};
+    }
+    const struct {
+        const char* what;
+        std::string bytes;
+        int encoding;
+    } cases[] = {
+        {"UTF-16, low byte first", "\xFF\xFE" + utf16(text, false), 3},
+        {"UTF-16, high byte first", "\xFE\xFF" + utf16(text, true), 2},
+        {"UTF-16 of this machine under the other mark", "\xFE\xFF" + utf16(text, false), 2},
+        {"UTF-32, low byte first", wide, 5},
+        {"UTF-32, high byte first", wideSwapped, 4},
+    };
+    for (const auto& c : cases) {
+        EXPECT_EQ(parse("a.srt", c.bytes), 0) << c.what;
+        EXPECT_EQ(subtitles.encoding(), c.encoding) << c.what;
+        EXPECT_EQ(entries(), "1000-2000 \xC3\x84\xE2\x82\xAC\n") << c.what;
+    }
+    parse("a.srt", "1\n00:00:01,000 --> 00:00:02,000\n\xC4\n");
+    EXPECT_EQ(entries(), "1000-2000 \xC4\n") << "bytes of an unknown encoding stay";
+    EXPECT_EQ(subtitles.encoding(), 0);
+}
+
+TEST_F(Subtitles, WhatGrowsBeyondItsFileIsCutAndTold) {
+    const std::u16string line = u"{1}{2}" + std::u16string(30, u'\u732B') + u"\n";
+    EXPECT_EQ(parse("a.sub", "\xFF\xFE" + utf16(line + line, false)), 0);
+    EXPECT_EQ(subtitles.unread(), 2 * (7 + 90) - (2 * 2 * 37 - 2));
+    EXPECT_EQ(parse("a.sub", "\xFF\xFE" + utf16(u"{1}{2}\u732B\n", false)), 0);
+    EXPECT_EQ(subtitles.unread(), 0);
+}
+
+TEST_F(Subtitles, WhatIsNoSubtitleFileIsRefused) {
+    LogCapture log;
+    EXPECT_EQ(parse("a.txt", "{1}{2}a\n"), -1);
+    EXPECT_TRUE(log.contains("Error: Unsupported subtitle format txt", QvLogMask::error));
+    EXPECT_EQ(parse("a.srt", "1\n00:00:01,000 --> 00:00:02,000\na\n\0b"s), -1) << "zeros are no text";
+    EXPECT_EQ(parse("a.srt", "1\n00:00:01,000 --> 00:00:02,000\na\n\0\0"s), 0) << "padding";
+    EXPECT_EQ(subtitles.nrSubtitles(), 1);
+    EXPECT_EQ(subtitles.parseFile(folder.file("none.srt").c_str(), pal), -1);
+    EXPECT_EQ(subtitles.nrSubtitles(), 0);
+    EXPECT_EQ(subtitles.parseFile(7, pal), -1);
+    NoMemory platform;
+    PlatformScope scope(platform);
+    EXPECT_EQ(parse("a.srt", "1\n"), -1);
+    EXPECT_TRUE(log.contains("parseFile() internal error"));
+}
+
+TEST_F(Subtitles, SavedFilesReadBack) {
+    parse("a.srt", "1\n00:00:01,500 --> 00:00:02,040\na|b\n\n2\n10:20:30,400 --> 10:20:31,000\n\n");
+    testing::internal::CaptureStdout();
+    EXPECT_EQ(subtitles.saveToFile(folder.file("b.srt").c_str(), QvSubtitles::SRT), 0);
+    const std::string echo = testing::internal::GetCapturedStdout();
+    EXPECT_EQ(
+        TempFolder::read(folder.file("b.srt")),
+        "1\r\n00:00:01,500 --> 00:00:02,040\r\na\r\nb\r\n\r\n2\r\n10:20:30,400 --> 10:20:31,000\r\n\r\n\r\n");
+    EXPECT_EQ(echo, "1\n00:00:01,500 --> 00:00:02,040\na\nb\n\n2\n10:20:30,400 --> 10:20:31,000\n\n\n");
+    testing::internal::CaptureStdout();
+    EXPECT_EQ(subtitles.saveToFile(folder.file("b.sub").c_str(), QvSubtitles::SUB), 0);
+    EXPECT_EQ(testing::internal::GetCapturedStdout(), "{37}{51}a|b\n{930760}{930775}\n");
+    EXPECT_EQ(TempFolder::read(folder.file("b.sub")), "{37}{51}a|b\r\n{930760}{930775}\r\n");
+    const std::string before = entries();
+    ASSERT_EQ(subtitles.parseFile(folder.file("b.srt").c_str(), pal), 0);
+    EXPECT_EQ(entries(), before);
+    EXPECT_EQ(subtitles.saveToFile(folder.file("c.x").c_str(), static_cast<QvSubtitles::Format>(3)), 0);
+    EXPECT_EQ(TempFolder::read(folder.file("c.x")), "");
+    EXPECT_EQ(subtitles.saveToFile(folder.file("no/b.srt").c_str(), QvSubtitles::SRT), -1);
+    FullDisc platform(10);
+    PlatformScope scope(platform);
+    EXPECT_EQ(subtitles.saveToFile(folder.file("full.srt").c_str(), QvSubtitles::SRT), -1);
+}
+
+TEST_F(Subtitles, EveryEntryIsFoundFromEverywhere) {
+    for (const int count : {1, 2, 3, 7, 40, 333, 1024}) {
+        std::string text;
+        for (int i = 0; i < count; ++i)
+            text += "{" + std::to_string(10 * i) + "}{" + std::to_string(10 * i + 4) + "}x\n";
+        parse("a.sub", text);
+        const auto at = [](int frame) { return MediaTime(frame, pal, MediaTime::defaultTimescale); };
+        // A stride that meets every entry, far from the one found last.
+        for (int k = 0, i = 0; k < count; ++k, i = (i + 617) % count) {
+            ASSERT_EQ(subtitles.find(at(10 * i + 4)), subtitles.at(i))
+                << count << ", the last instant counts";
+            ASSERT_EQ(subtitles.find(at(10 * i + 7)), nullptr) << "between two";
+            ASSERT_EQ(subtitles.find(at(10 * i)), subtitles.at(i)) << count;
+        }
+    }
+    parse("a.sub", "");
+    EXPECT_EQ(subtitles.find(MediaTime(0)), nullptr);
+}
+
+TEST_F(Subtitles, AnotherRateKeepsTheFrames) {
+    parse("a.sub", "{25}{50}a\n");
+    subtitles.changeFramerate(QvFramerate(24.0));
+    EXPECT_EQ(subtitles.at(0)->end, MediaTime(50, QvFramerate(24.0), MediaTime::defaultTimescale));
+    subtitles.changeFramerate(QvFramerate(29.97));
+    EXPECT_EQ(subtitles.at(0)->start.position(QvFramerate(29.97)), 25);
+    const MediaTime start = subtitles.at(0)->start;
+    subtitles.changeFramerate(QvFramerate(29.97, 1));
+    EXPECT_EQ(subtitles.at(0)->start, start);
+    EXPECT_EQ(subtitles.rate().interlaced(), 1);
+}
+
+}  // namespace

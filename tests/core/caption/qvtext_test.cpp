@@ -1,0 +1,92 @@
+#include "core/caption/qvtext.h"
+
+#include <gtest/gtest.h>
+
+#include <string>
+#include <vector>
+
+namespace {
+
+using namespace std::string_literals;
+
+TEST(Text, EveryEncodingBecomesCodePoints) {
+    const struct {
+        const char* what;
+        std::string bytes;
+        int encoding;
+        std::u32string expected;
+    } cases[] = {
+        {"bytes stand for themselves", "a\xE9\xFF", 0, U"a\u00E9\u00FF"},
+        {"UTF-8", "a\xC3\xA9\xF0\x9F\x98\x80", 1, U"a\u00E9\U0001F600"},
+        {"ill-formed UTF-8", "a\xC3(", 1, U"a\uFFFD("},
+        {"UTF-16 with a pair", "a\0\x3D\xD8\0\xDE"s, 2, U"a\U0001F600"},
+        {"UTF-16, half a pair at the end", "a\0\x3D\xD8"s, 2, U"a\uFFFD"},
+        {"UTF-16, an odd byte", "a\0b"s, 2, U"a"},
+        {"UTF-16 ends at a zero unit", "a\0\0\0b\0"s, 2, U"a"},
+        {"UTF-32", "a\0\0\0\0\xF6\x01\0"s, 3, U"a\U0001F600"},
+        {"UTF-32 cut", "a\0\0\0b\0"s, 3, U"a"},
+        {"code page", "\xC7\xE1", 1256, U"\u0627\u0644"},
+        {"lead bytes of a code page", "\x83\x7C|", 932, U"\u30DD|"},
+        {"unknown code page", "a\xC7", 99999, U"a\uFFFD"},
+        {"zero ends bytes", "a\0b"s, 0, U"a"},
+        {"nothing", "", 1252, U""},
+    };
+    for (const auto& c : cases) {
+        EXPECT_EQ(QvText::toUtf32(c.bytes, c.encoding), c.expected) << c.what;
+        std::vector<unsigned> out(c.bytes.size() + 1, 77);
+        const std::string terminated = c.bytes + "\0\0\0\0"s;
+        // The forms without a length cannot know of a cut unit.
+        if (c.bytes.size() % (c.encoding == 2 ? 2 : c.encoding == 3 ? 4 : 1) != 0) continue;
+        const int count = QvText::encodingToUtf32(terminated.c_str(), c.encoding, out.data());
+        EXPECT_EQ(std::u32string(out.begin(), out.begin() + count), c.expected) << c.what;
+        EXPECT_EQ(out[static_cast<std::size_t>(count)], 0u) << c.what;
+    }
+}
+
+TEST(Text, BuffersGoThereAndBack) {
+    const std::string text = "a\xC3\xA9\xE2\x82\xAC\xF0\x9F\x98\x80";
+    unsigned wide[16];
+    char narrow[64];
+    EXPECT_EQ(QvText::utf8ToUtf32(text.c_str(), wide), 4);
+    EXPECT_EQ(QvText::utf32ToUtf8(wide, narrow), 10);
+    EXPECT_EQ(narrow, text);
+    const unsigned short units[] = {'a', 0x20AC, 0xD83D, 0xDE00, 0};
+    EXPECT_EQ(QvText::utf16ToUtf32(units, wide), 3);
+    EXPECT_EQ(wide[2], 0x1F600u);
+    const unsigned bad[] = {0x110000, 0xD800, 0};
+    QvText::utf32ToUtf8(bad, narrow);
+    EXPECT_STREQ(narrow, "\xEF\xBF\xBD\xEF\xBF\xBD");
+}
+
+TEST(Text, StringsAndWideStrings) {
+    Any wide, narrow;
+    EXPECT_EQ(QvText::utf8ToWchar("\xE2\x82\xAC", wide), 0);
+    ASSERT_TRUE(wide.isWString());
+    EXPECT_EQ(wide.asWString()[0], 0x20AC);
+    EXPECT_EQ(QvText::wcharToUtf8(wide, narrow), 0);
+    EXPECT_EQ(narrow, "\xE2\x82\xAC");
+    EXPECT_EQ(QvText::stringToWchar(7, wide), -1);
+    EXPECT_FALSE(wide.isValid());
+}
+
+TEST(Text, EncodingsCanBeChosen) {
+    AnyVector all;
+    all.append(Any("old"));
+    QvText::availableEncodings(all);
+    ASSERT_GT(all.size(), 10);
+    const char* names[] = {"UTF-32", "UTF-16", "UTF-8", "ASCII"};
+    for (int i = 0; i < 4; ++i) {
+        EXPECT_EQ(all[i].asDict()["name"], names[i]);
+        EXPECT_EQ(all[i].asDict()["identifier"], 3 - i);
+    }
+    EXPECT_EQ(QvText::encodingName(1256), "windows-1256");
+    EXPECT_EQ(QvText::encodingName(0), "ASCII");
+    EXPECT_EQ(QvText::encodingName(4), "N/A");
+}
+
+TEST(Text, NothingActsOnACommandLine) {
+    EXPECT_EQ(QvText::cliEscape("a b; $(rm x)"), "'a b; $(rm x)'");
+    EXPECT_FALSE(QvText::cliEscape(3).isValid());
+}
+
+}  // namespace
