@@ -1,0 +1,273 @@
+#include "core/caption/qvcc.h"
+
+#include <gtest/gtest.h>
+
+#include <cstring>
+#include <string>
+#include <vector>
+
+#include "core/caption/cctext.h"
+#include "core/engine/qvexception.h"
+#include "core/value/any.h"
+#include "core/value/anycontainer.h"
+
+namespace {
+
+// "fc9420" a pair, as in "fc9420 fc80 80".
+std::string hex(const QvCcData& data) {
+    std::string text;
+    for (const auto& pair : data.pairs())
+        text += Any::sprintf("%02x%02x%02x ", pair.header, pair.byte1, pair.byte2).asString();
+    if (!text.empty()) text.pop_back();
+    return text;
+}
+
+std::string times(std::string_view pair, int count) {
+    std::string text;
+    for (int i = 0; i < count; ++i) text += " " + std::string(pair);
+    return text;
+}
+
+// Pairs of these types, one a tick from 0 on, numbered in byte 2.
+QvCcData listOf(const std::vector<int>& types) {
+    QvCcData data;
+    for (const int type : types)
+        data.append(QvCcBytePair(MediaTime(data.count()), type, 0x20, data.count(), true));
+    return data;
+}
+
+TEST(QvCcBytePair, HeaderAndStoredForm) {
+    QvCcBytePair pair(0, 0x94, 0x2C, false);
+    EXPECT_EQ(pair.header, 0xF8);
+    EXPECT_TRUE(pair.isFiller());
+    pair.setValid(true);
+    pair.setType(3);
+    EXPECT_EQ(pair.header, 0xFF);
+    pair.invalidToNull();
+    EXPECT_EQ(pair, QvCcBytePair(3, 0x94, 0x2C, true));
+    QvCcBytePair null(1, 1, 2, false);
+    null.invalidToNull();
+    EXPECT_EQ(null, QvCcBytePair(1, 0x80, 0x80, true));
+    EXPECT_EQ(QvCcBytePair(MediaTime(3, 2), 0, 0, 0, true).time, MediaTime(1.5));
+
+    AnyDict dict;
+    QvCcBytePair(MediaTime(7), 2, 0xAB, 0xCD, true).store(dict);
+    EXPECT_EQ(dict.getInt32("d"), 0xFEABCD);
+    EXPECT_EQ(pair.restore(dict), 0);
+    EXPECT_EQ(pair, QvCcBytePair(MediaTime(7), 2, 0xAB, 0xCD, true));
+    for (const auto& broken : {AnyDict("d", 1), AnyDict("t", MediaTime(1)),
+                               AnyDict("d", 1LL, "t", MediaTime(1)), AnyDict("d", 1, "t", 1)})
+        EXPECT_EQ(pair.restore(broken), -1);
+    EXPECT_EQ(pair.time, MediaTime(7));
+}
+
+TEST(QvCcData, FindsByTypeTimeAndPlace) {
+    QvCcData data = listOf({0, 1, 2, 3, 0, 1, 0});
+    data.at(4).setValid(false);
+    const int mask0 = 1, mask708 = 12, two = 2, none = 0, far = 99, back = -1, four = 4;
+    const MediaTime t2(2), t4(4);
+    const bool valid = true;
+    using List = AnyVector;
+    EXPECT_EQ(data.find(nullptr, nullptr, nullptr, nullptr, nullptr, nullptr, true, nullptr).size(), 7);
+    EXPECT_EQ(data.find(&mask0, nullptr, nullptr, nullptr, nullptr, nullptr, true, nullptr), List(0, 4, 6));
+    EXPECT_EQ(data.find(&mask0, nullptr, nullptr, nullptr, nullptr, &valid, true, nullptr), List(0, 6));
+    EXPECT_EQ(data.find(&mask708, nullptr, nullptr, nullptr, nullptr, nullptr, true, nullptr), List(2, 3));
+    EXPECT_EQ(data.find(nullptr, nullptr, nullptr, &t2, &t4, nullptr, true, nullptr), List(2, 3, 4));
+    EXPECT_EQ(data.find(nullptr, &far, &back, nullptr, nullptr, nullptr, true, nullptr), List(Any(6)));
+    EXPECT_EQ(data.find(nullptr, &two, &four, nullptr, nullptr, nullptr, true, &two), List(2, 3));
+    EXPECT_TRUE(data.find(nullptr, nullptr, nullptr, nullptr, nullptr, nullptr, true, &none).empty());
+    data.at(1).time = MediaTime(50);
+    EXPECT_FALSE(data.isSorted());
+    EXPECT_EQ(data.find(nullptr, nullptr, nullptr, nullptr, &t4, nullptr, true, nullptr), List(Any(0)));
+    EXPECT_EQ(data.find(nullptr, nullptr, nullptr, nullptr, &t4, nullptr, false, nullptr), List(0, 2, 3, 4));
+    EXPECT_TRUE(QvCcData().find(nullptr, &two, &four, nullptr, nullptr, nullptr, true, nullptr).empty());
+}
+
+TEST(QvCcData, ChangesKeepTheOrderOfTheRest) {
+    QvCcData data = listOf({0, 0, 1, 2, 0, 1});
+    data.remove(AnyVector(4, 1, 1, 77, -3), false);
+    data.remove(9);
+    EXPECT_EQ(hex(data), "fc2000 fd2002 fe2003 fd2005");
+    const AnyVector some(3, 0);
+    data.extend(data, &some);
+    TPtrList<QvCcBytePair> chosen;
+    data.select(some, chosen);
+    EXPECT_EQ(chosen.at(0), &data.at(3));
+    EXPECT_EQ(data.at(4).time, MediaTime(5));
+    data.extend(data);
+    EXPECT_EQ(data.count(), 12);
+    data.clear();
+    data.appendFillers(1, 0, true, MediaTime(5));
+    data.appendFillers(1, 1, false, MediaTime(5));
+    data.append(QvCcBytePair(MediaTime(6), 2, 0, 0, true));  // DTVCC zeros may be content
+    data.appendFillers(1, 3, true, MediaTime(6));
+    data.appendFillers(2, 0, true, MediaTime(7));
+    EXPECT_EQ(hex(data), "fc8080 f90000 fe0000 ff0000 fc8080 fc8080");
+    EXPECT_EQ(data.removeFillers(MediaTime(6)), 2);
+    EXPECT_EQ(hex(data), "fe0000 ff0000 fc8080 fc8080");
+    data.setTime(MediaTime(1), -5, 1);
+    data.setTime(MediaTime(9), 3);
+    data.shiftTimes(MediaTime(-3));
+    EXPECT_EQ(data.minTime(), MediaTime(-2));
+    EXPECT_EQ(data.maxTime(true), MediaTime(6));
+    EXPECT_EQ(QvCcData().maxTime(), MediaTime());
+    EXPECT_THROW(data.at(4), QvAssertFailure);
+    EXPECT_EQ(listOf({0, 0, 2}).dbgDump(nullptr),
+              "cnt=3, process=1, 608-1 0.000000 2000, 608-1 0.000000 2001, 708-d 0.000000 2002");
+}
+
+TEST(QvCcData, StoredFormReadsBackOrIsRefusedWhole) {
+    QvCcData data = listOf({0, 1, 2, 3});
+    data.setProcessCCDataFlag(false);
+    AnyDict dict;
+    data.store(dict);
+    EXPECT_EQ(dict["name"], "cc_data");
+    QvCcData back;
+    ASSERT_EQ(back.restore(dict), 0);
+    EXPECT_EQ(back, data);
+    AnyDict other = dict, broken = dict;
+    other.set("name", "text");
+    broken["data"].asVector().append(1);
+    for (const AnyDict& bad : {AnyDict(), other, broken, AnyDict("name", "cc_data", "data", 3)})
+        EXPECT_EQ(back.restore(bad), -1);
+    EXPECT_EQ(back, data);
+}
+
+TEST(QvCcData, BuffersOfEachFormat) {
+    const struct {
+        int fmt;
+        std::string bytes;
+    } rows[] = {
+        {0, std::string("\xC2\xFF\xFC\x94\x20\xFA\x00\x00", 8)},
+        {3, std::string("GA94\x03\xC2\xFF\xFC\x94\x20\xFA\x00\x00\xFF", 14)},
+        {5, std::string("\xB5\x00\x31GA94\x03\xC2\xFF\xFC\x94\x20\xFA\x00\x00\xFF", 17)},
+    };
+    QvCcData data;
+    data.append(QvCcBytePair(0, 0x94, 0x20, true));
+    data.appendFillers(1, 2, false, MediaTime());
+    for (const auto& row : rows) {
+        std::string buffer(120, 'x');
+        auto* bytes = reinterpret_cast<unsigned char*>(buffer.data());
+        const int size = static_cast<int>(row.bytes.size());
+        EXPECT_EQ(data.byteSize(row.fmt), size);
+        EXPECT_EQ(data.toBuffer(row.fmt, size - 1, bytes), -18);
+        EXPECT_EQ(data.toBuffer(row.fmt, 120, bytes), size);
+        EXPECT_EQ(buffer, row.bytes + std::string(buffer.size() - row.bytes.size(), 'x'));
+        EXPECT_EQ(QvCcData::detectBufferFmt(size, bytes), row.fmt == 0 ? -1 : row.fmt);
+        QvCcData back;
+        const MediaTime t(42);
+        for (int cut = 0; cut < size - (row.fmt ? 1 : 0); ++cut)  // the last marker is not needed
+            EXPECT_EQ(back.fromBuffer(row.fmt, cut, bytes, &t), -18) << row.fmt << " " << cut;
+        ASSERT_EQ(back.fromBuffer(row.fmt, size, bytes, &t), 0);
+        EXPECT_EQ(hex(back), "fc9420 fa0000");
+        EXPECT_EQ(back.at(1).time, t);
+    }
+    const auto* head = reinterpret_cast<const unsigned char*>("GA94\x03\x80\xFF");
+    EXPECT_EQ(QvCcData::detectBufferFmt(7, head), 3);
+    EXPECT_EQ(QvCcData::detectBufferFmt(6, head), -1);
+    EXPECT_EQ(data.byteSize(4), -12);
+    EXPECT_EQ(data.fromBuffer(4, 7, head, nullptr), -12);
+    data.appendFillers(29, 2, false, MediaTime());
+    unsigned char full[104];
+    EXPECT_EQ(data.toBuffer(5, 104, full), 104);
+    EXPECT_EQ(data.fromBuffer(5, 104, full, nullptr), 0);
+    EXPECT_EQ(data.count(), 31);
+    data.appendFillers(1, 2, false, MediaTime());
+    EXPECT_EQ(data.toBuffer(5, 104, full), -18);
+    EXPECT_EQ(data.fromBuffer(0, 96, full, nullptr), -18);
+}
+
+// The 608 slots of four frames, then the number of slots, for every rate.
+TEST(QvCcProcessor, ScheduleOfEachRate) {
+    using Rate = QvFramerate;
+    const QvFramerate bottom59(QvRatio(30000, 1001), 2), bottom60(QvRatio(30, 1), 2);
+    const struct {
+        QvFramerate rate;
+        const char* types;
+        int slots;
+    } rows[] = {
+        {Rate::f29p(), "01 01 01 01", 20},   {Rate::f30p(), "01 01 01 01", 20},
+        {Rate::f59i(), "01 01 01 01", 20},   {Rate::f60i(), "01 01 01 01", 20},
+        {bottom59, "10 10 10 10", 20},       {bottom60, "10 10 10 10", 20},
+        {Rate::f60p(), "0 1 0 1", 10},       {Rate::f59p(), "0 1 0 1", 10},
+        {Rate::f23p(), "01 010 10 101", 25}, {Rate::f24p(), "01 010 10 101", 25},
+    };
+    for (const auto& row : rows) {
+        QvCcProcessor queue;
+        queue.start(true, true, row.rate, 0);
+        std::string types;
+        for (int frame = 0; frame < 4; ++frame) {
+            QvCcData out;
+            ASSERT_EQ(queue.get(out, MediaTime()), 0);
+            EXPECT_EQ(out.count(), row.slots);
+            if (frame) types += ' ';
+            for (const auto& pair : out.pairs())
+                if (pair.is608()) types += static_cast<char>('0' + pair.type());
+        }
+        EXPECT_EQ(types, row.types) << row.rate.desc(true, true).asString();
+    }
+    for (const auto& rate : {Rate::f25p(), Rate::f50p(), Rate::f50i()}) {
+        QvCcProcessor queue;
+        queue.start(true, true, rate, 0);
+        QvCcData out;
+        EXPECT_THROW(queue.get(out, MediaTime()), QvAssertFailure);
+    }
+}
+
+TEST(QvCcProcessor, DealsOutWhatIsDueAndFillsUp) {
+    QvCcProcessor queue;
+    QvCcData out;
+    queue.start(true, false, QvFramerate::f30p(), QvCcProcessor::valid608_1);
+    queue.get(out, MediaTime());
+    EXPECT_EQ(hex(out), "fc8080 f90000" + times("fa0000", 18));
+
+    queue.append(listOf({0, 0, 1, 2, 3, 0}));
+    queue.append(QvCcBytePair(MediaTime(6), 0, 1, 2, false));
+    const char* const expected[] = {"fc2000 fd2002", "fc2001 f90000", "fc8080 f90000"};
+    for (const char* leading : expected) {
+        queue.get(out, MediaTime(4));
+        EXPECT_EQ(hex(out), leading + times("fa0000", 18));
+    }
+    EXPECT_EQ(hex(queue), "fe2003 ff2004 fc2005 f80102");  // DTVCC stays, and what is not due
+    queue.get(out, MediaTime(6));
+    EXPECT_EQ(out.at(1).time, MediaTime(5));  // fillers carry the time before them
+    queue.get(out, MediaTime(6));
+    EXPECT_EQ(out.at(0), QvCcBytePair(MediaTime(6), 0, 0x80, 0x80, true));
+    EXPECT_EQ(queue.frameCounter(), 6);
+
+    queue.start(false, true, QvFramerate::f30p(), 3);
+    EXPECT_EQ(queue.count(), 0);
+    queue.append(listOf(std::vector<int>(20, 2)));
+    queue.append(QvCcBytePair(MediaTime(20), 0, 1, 2, true));
+    queue.get(out, MediaTime(99));
+    EXPECT_EQ(hex(out).substr(0, 27), "fc8080 fd8080 fe2000 fe2001");
+    EXPECT_EQ(hex(queue), "fe2012 fe2013 fc0102");
+    EXPECT_THROW(queue.get(queue, MediaTime()), QvAssertFailure);
+}
+
+TEST(QvCcText, ReadsAllCharacterSets) {
+    const struct {
+        int type;
+        std::vector<int> words;
+        const char* text;
+    } rows[] = {
+        {0, {0x9420, 0x9420, 0x9470, 0x9470, 0xC8E5, 0xECEC, 0xEF80, 0x942F}, "Hello"},
+        {0, {0x9470, 0x6180, 0x94D0, 0x97A1, 0x6280}, "a|b"},                 // two rows, a tab
+        {0, {0x91B0, 0x91B0, 0x91B0, 0x1137, 0x1939}, "®®♪"},                 // sent twice, meant once
+        {0, {0x2A5C, 0x5E5F, 0x607B, 0x7C7D, 0x7E27}, "áéíóúç÷Ññ’"},          // the basic set's own
+        {0, {0x4520, 0x1220, 0x5320, 0x9B34, 0x6F80, 0x1330}, "EÁSßÄ"},       // replace the one before
+        {0, {0x6162, 0x1421, 0x91AE, 0x6380, 0x1C2D, 0x6480}, "a c|d"},       // back, style, return
+        {1, {0x0105, 0x4142, 0x0F15, 0x152C, 0x4344, 0x0107, 0x4546}, "CD"},  // services between
+        {0, {0x8080, 0x0000, 0x1240, 0x1180, 0x101F, 0x1F20}, ""},
+    };
+    for (const auto& row : rows) {
+        QvCcData data;
+        for (const int word : row.words) {
+            data.append(QvCcBytePair(row.type, word >> 8, word, true));
+            data.append(QvCcBytePair(1 - row.type, 0x41, 0x42, true));
+        }
+        EXPECT_EQ(qvCcText(data.pairs(), row.type), row.text);
+    }
+}
+
+}  // namespace
