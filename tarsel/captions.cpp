@@ -71,9 +71,8 @@ std::unique_ptr<QvDecodePipe> openFiles(const std::vector<std::string>& files) {
     }
     decoder->setParam("filenames", names);
     if (decoder->open() == QvStatus::ok) return decoder;
-    throw Failure(Exit::input, "can't read captions of " + inQuotes(files.front()) + ": " +
-                                   (decoder->errorDesc() && files.size() > 1 ? decoder->errorDesc()
-                                                                             : "it has none, or is no SCC file"));
+    throw Failure(Exit::input, "can't open " + inQuotes(files.front()) +
+                                   ": it is no SCC file, or no line of it has captions");
 }
 
 void showCaptions(const std::vector<std::string>& files, bool json) {
@@ -84,7 +83,8 @@ void showCaptions(const std::vector<std::string>& files, bool json) {
     for (int frame = 0; frame < frames; ++frame) {
         AnyDict stored;
         QvCcData data;
-        if (decoder->readFrame(0) != QvStatus::ok || decoder->readMeta(0, 0, stored) != QvStatus::ok) continue;
+        if (decoder->readFrame(0) != QvStatus::ok || decoder->readMeta(0, 0, stored) != QvStatus::ok)
+            continue;
         if (data.restore(stored) == QvStatus::ok) printFrame(data, rate, json);
     }
 }

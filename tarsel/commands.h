@@ -12,6 +12,7 @@ using Action = std::function<void()>;
 
 void addTranscode(CLI::App& app, Action& chosen, Signals& signals);
 void addInfo(CLI::App& app, Action& chosen);
+void addCaptions(CLI::App& app, Action& chosen);
 void addModules(CLI::App& app, Action& chosen);
 void addFormats(CLI::App& app, Action& chosen);
 void addPresets(CLI::App& app, Action& chosen);

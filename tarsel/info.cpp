@@ -45,6 +45,11 @@ Json describeStream(const QvDecodePipe& decoder, int type, int number) {
         if (p.get("frameAspect").isDouble()) stream["frame_aspect"] = p.get("frameAspect").asDouble();
         integer("frames", "frames");
         integer("nrViews", "views");
+    } else if (type == 4) {
+        if (p.get("framerate").isFramerate())
+            stream["timecode"] = text(p.get("framerate").asFramerate().desc(true, false));
+        integer("frames", "frames");
+        integer("pairs", "pairs");
     } else {
         integer("samplerate", "samplerate");
         integer("channels", "channels");

@@ -92,6 +92,7 @@ int main(int argc, char** argv) {
     Action chosen;
     addTranscode(app, chosen, signals);
     addInfo(app, chosen);
+    addCaptions(app, chosen);
     addFrame(app, chosen, signals);
     addModules(app, chosen);
     addFormats(app, chosen);

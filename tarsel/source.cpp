@@ -167,10 +167,23 @@ void Source::openRaw(const std::string& raw) {
     if (d.nrFrames(0) == 0) refuse("the file is shorter than one frame of " + *size + " " + *pixel);
 }
 
+namespace {
+
+bool isCaptionFile(const std::string& name) {
+    const Any ext = QvFile::getExt(Any(name.c_str()), true);
+    return ext == "scc" || ext == "sc2";
+}
+
+// Half of all caption files are written in drop frame.
+Any captionParameters() { return AnyDict("dropFrameLines", 1); }
+
+}  // namespace
+
 // Why the best decoder refuses the file. The factory keeps only its name, so it is asked once more.
 std::string Source::reasonOf(const AnyVector& decoders) const {
     std::unique_ptr<QvCodec> codec(qv_registry()->newCodec(decoders.at(0).asString()));
     if (!codec) return std::string("the decoder ") + decoders.at(0).asString() + " can't be used";
+    if (isCaptionFile(name_)) codec->setParam("openParameters", captionParameters());
     codec->setParam("filename", name_.c_str());
     if (codec->open() == QvStatus::ok || !*codec->errorDesc()) return "no decoder can read it";
     return codec->errorDesc();
@@ -178,7 +191,9 @@ std::string Source::reasonOf(const AnyVector& decoders) const {
 
 void Source::openFile() {
     const Any ext = QvFile::getExt(Any(name_.c_str()), true);
-    decoder_.reset(QvDecFactory::decodePipe(Any(name_.c_str())));
+    const Any params = captionParameters();
+    decoder_.reset(QvDecFactory::decodePipe(Any(name_.c_str()), Any(), nullptr,
+                                            isCaptionFile(name_) ? &params : nullptr));
     if (decoder_) return;
     const AnyVector candidates = qv_registry()->decoders(ext.asString());
     const std::unique_ptr<AnyVector> exts(qv_registry()->inputExts(false, false));

@@ -42,13 +42,15 @@ std::string basicCharacter(int code) {
 
 class Reader {
   public:
+    explicit Reader(bool hasServices) : hasServices_(hasServices) {}
+
     void take(int first, int second) {
         if (first >= 0x10 && first < 0x20) {
             takeControl(first, second);
             return;
         }
         lastControl_ = 0;
-        if (first != 0 && first < 0x10) {  // a data service: start, continue or, with 0x0F, end
+        if (hasServices_ && first != 0 && first < 0x10) {  // start, continue or, with 0x0F, end
             inService_ = first != 0x0F;
         } else if (!inService_) {
             for (const int code : {first, second})
@@ -109,6 +111,7 @@ class Reader {
     }
 
     std::string text_, row_;
+    bool hasServices_;  // data services stand between the captions
     int lastControl_ = 0;
     bool inService_ = false;
 };
@@ -116,7 +119,7 @@ class Reader {
 }  // namespace
 
 std::string qvCcText(std::span<const QvCcBytePair> pairs, int type) {
-    Reader reader;
+    Reader reader(type == QvCcBytePair::field2);
     for (const auto& pair : pairs)
         if (pair.type() == type && pair.valid()) reader.take(pair.byte1 & 0x7F, pair.byte2 & 0x7F);
     return reader.text();

@@ -230,8 +230,8 @@ TEST_F(SccDecoder, CaptionsOfALinkedFileReachTheEncoder) {
         {QvFramerate::f29p(), "4:0 9420 5:0 9421 5:1 1520 6:0 9422 6:1 1521 29:0 942f 29:1 152f "},
         // Two frames to one of the file, the fields take turns.
         {QvFramerate::f59p(), "8:0 9420 10:0 9421 11:1 1520 12:0 9422 13:1 1521 58:0 942f 59:1 152f "},
-        // Frames 4 and 5 of the file lie within 3 and 4 (0.133 s, 0.167 s).
-        {QvFramerate::f23p(), "3:0 9420 4:0 9421 4:1 1520 5:0 9422 5:1 1521 23:0 942f 23:1 152f "},
+        // Frame 4 of the file begins behind the start of 3, frame 5 with 4.
+        {QvFramerate::f23p(), "4:0 9420 4:1 1520 5:0 9421 5:1 1521 5:0 9422 24:0 942f 24:1 152f "},
     };
     for (const auto& row : rows) {
         ASSERT_EQ(open(one + "," + two), 0);
