@@ -1,0 +1,261 @@
+#include "core/transcode/pushencoder.h"
+
+#include <gtest/gtest.h>
+
+#include <atomic>
+#include <thread>
+
+#include "core/encode/qvencodepipe.h"
+#include "core/engine/qvexception.h"
+#include "core/engine/qvutil.h"
+#include "core/transcode/processparams.h"
+#include "tests/support/failing_codecs.h"
+#include "tests/support/log_capture.h"
+#include "tests/support/pictures.h"
+#include "tests/support/temp_folder.h"
+
+namespace {
+
+constexpr int width = 64, height = 48, samplerate = 48000;
+const QvFramerate rate(QvRatio(30000, 1001));
+
+class Pushing : public testing::Test {
+  protected:
+    Pushing() {
+        init_wrapper(nullptr);
+        pipe_.reset(QvEncodePipe::create());
+        pipe_->clearStreams();
+        pipe_->setFilename(Any(folder_.file("out.x").c_str()));
+    }
+    ~Pushing() override {
+        pipe_.reset();
+        cleanup_wrapper();
+    }
+
+    static AnyDict videoFormat() {
+        return AnyDict("FOURCC", static_cast<int>(QvFourcc::I420), "width", width, "height", height,
+                       "framerate", rate);
+    }
+    static AnyDict audioFormat(int bufferLength = 48000) {
+        return AnyDict("samplerate", samplerate, "channels", 2, "bitsPerSample", 16, "bufferLength",
+                       bufferLength);
+    }
+    void add(QvPushEncoder& push, bool video, bool audio, int bufferLength = 48000) {
+        AnyDict pictures = videoFormat(), sound = audioFormat(bufferLength);
+        ASSERT_EQ(push.setEncoder(pipe_.get()), 0);
+        if (video) {
+            ASSERT_EQ(pipe_->addVideoStream("rawvenc"), 0);
+            pipe_->setParam("video0", AnyDict("type", static_cast<int>(QvFourcc::I420), "width", width,
+                                              "height", height, "framerate", rate));
+            ASSERT_EQ(push.addVideoStream(pictures, nullptr), 0);
+        }
+        if (audio) {
+            ASSERT_EQ(pipe_->addAudioStream("rawaenc"), 0);
+            ASSERT_EQ(push.addAudioStream(sound, nullptr), 0);
+        }
+    }
+    static void waitUntil(QvPushEncoder& push, bool (QvPushEncoder::*needs)(int) const) {
+        while (!(push.*needs)(0) && push.running()) push.process();
+    }
+    static QvFrame picture(unsigned seed) { return makePicture(QvFourcc::I420, width, height, seed); }
+    std::string file(const char* name) { return TempFolder::read(folder_.file(name)); }
+
+    TempFolder folder_;
+    std::unique_ptr<QvEncodePipe> pipe_;
+};
+
+void writeSamples(QvPushEncoder& push, int count, unsigned seed, std::string& all) {
+    QvPcm pcm;
+    fillSound(pcm, count, 2, 2, samplerate, seed);
+    ASSERT_EQ(push.writeSamples(&pcm, 0), 0);
+    all += soundBytes(pcm);
+}
+
+// Buffers too small for their writers, two of which run beside the worker: nothing is lost, nothing doubled.
+TEST_F(Pushing, EverythingArrives) {
+    constexpr int frames = 60, before = 20;
+    LogCapture log;
+    QvPushEncoder push;
+    add(push, true, true, 500);
+    ASSERT_EQ(push.open(), 0) << push.errorDesc();
+    std::string pictures, sound;
+    const auto pushPicture = [&](int number) {
+        QvFrame frame = picture(static_cast<unsigned>(number));
+        frame.setTimestamp(number);
+        ASSERT_EQ(push.writeFrame(&frame, 0), 0);
+        pictures += pictureBytes(frame);
+    };
+    for (int i = 0; i < before; ++i) pushPicture(i);
+    writeSamples(push, 1200, 1, sound);  // more than twice what fits
+    EXPECT_EQ(log.count("[FrameBuffer] *** Growing buffer to"), 3);
+    EXPECT_TRUE(log.contains("Growing buffer to 32 frames", QvLogMask::warning));
+    EXPECT_TRUE(log.contains("[SampleBuffer] *** Growing to 1500 samples", QvLogMask::warning));
+    writeSamples(push, 1000, 2, sound);
+    EXPECT_TRUE(log.contains("[SampleBuffer] *** Growing to 3000 samples", QvLogMask::warning));
+
+    ASSERT_EQ(push.start(), 0);
+    EXPECT_THROW(push.start(), QvAssertFailure);
+    std::thread videoWriter([&] {
+        for (int i = before; i < frames; ++i) pushPicture(i);
+    });
+    std::thread audioWriter([&] {
+        for (unsigned i = 0; i < 130; ++i)
+            writeSamples(push, 100 + static_cast<int>(i * 37 % 1900), i, sound);
+        EXPECT_EQ(push.writeSamples(nullptr, 0), 0);
+    });
+    videoWriter.join();
+    audioWriter.join();
+    waitUntil(push, &QvPushEncoder::needsVideo);
+    EXPECT_FALSE(push.finished());
+    EXPECT_EQ(push.writeFrame(nullptr, 0), QvStatus::endOfStream);
+    waitUntil(push, &QvPushEncoder::needsVideo);
+    EXPECT_FALSE(push.running());
+    EXPECT_EQ(push.close(false), 0);
+    EXPECT_TRUE(log.contains("[PuhEncoder::loop] thread exiting"));
+    EXPECT_TRUE(log.contains("[pushencoder] total out frames 60"));
+    ASSERT_EQ(pipe_->close(), 0);
+    EXPECT_EQ(file("out.raw"), pictures);
+    const auto samples = static_cast<size_t>(QvUtil::samplesForFrames(frames, rate, samplerate));
+    ASSERT_GT(sound.size(), samples * 4);
+    EXPECT_EQ(file("out.wav").substr(80), sound.substr(0, samples * 4));
+}
+
+TEST_F(Pushing, SoundAlone) {
+    QvPushEncoder push;
+    add(push, false, true);
+    ASSERT_EQ(push.open(), 0);
+    ASSERT_EQ(push.start(), 0);
+    std::string sound;
+    for (unsigned i = 0; i < 20; ++i) {
+        waitUntil(push, &QvPushEncoder::needsAudio);
+        writeSamples(push, 777, i, sound);
+    }
+    push.writeSamples(nullptr, 0);
+    waitUntil(push, &QvPushEncoder::needsAudio);
+    EXPECT_EQ(push.close(false), 0);
+    ASSERT_EQ(pipe_->close(), 0);
+    EXPECT_EQ(file("out.wav").substr(80), sound);
+}
+
+TEST_F(Pushing, AnEndMarkDropsWhatIsQueued) {
+    QvPushEncoder push;
+    add(push, true, false);
+    ASSERT_EQ(push.open(), 0);
+    QvFrame frame = picture(1);
+    for (int i = 0; i < 3; ++i) EXPECT_EQ(push.writeFrame(&frame, 0), 0);
+    EXPECT_EQ(push.writeFrame(nullptr, 0), QvStatus::endOfStream);
+    ASSERT_EQ(push.start(), 0);
+    waitUntil(push, &QvPushEncoder::needsVideo);
+    EXPECT_EQ(push.close(false), 0);
+    EXPECT_EQ(pipe_->close(), 0);
+    EXPECT_EQ(file("out.raw"), "");
+}
+
+TEST_F(Pushing, FormatsAreChecked) {
+    struct Row {
+        int rate, channels, bytes, bits;
+        int logged;  // lines
+    };
+    QvPushEncoder push;
+    for (const auto& row : {Row{96000, 2, 0, 16, 0}, Row{96001, 2, 0, 16, 1}, Row{0, 2, 0, 16, 1},
+                            Row{48000, 0, 0, 16, 1}, Row{0, 0, 5, 0, 3}, Row{48000, 1, 4, 0, 0},
+                            Row{48000, 1, 0, 20, 0}, Row{48000, 1, 2, 24, 1}, Row{48000, 1, 0, 0, 1}}) {
+        SCOPED_TRACE(testing::Message() << row.rate << " " << row.channels << " " << row.bits);
+        LogCapture log;
+        AnyDict format("samplerate", row.rate, "channels", row.channels);
+        if (row.bytes) format.set("bytesPerSample", row.bytes);
+        if (row.bits) format.set("bitsPerSample", row.bits);
+        EXPECT_EQ(push.addAudioStream(format, nullptr), row.logged ? -1 : 0);
+        EXPECT_EQ(log.count("[PushEncoder] addAudioStream - invalid", QvLogMask::error), row.logged);
+    }
+    AnyDict odd("samplerate", 48000, "channels", 1, "bitsPerSample", 17);
+    EXPECT_THROW(push.addAudioStream(odd, nullptr), QvAssertFailure);
+    AnyDict incomplete = videoFormat();
+    incomplete.remove("framerate");
+    EXPECT_EQ(push.addVideoStream(incomplete, nullptr), QvStatus::failed);
+    AnyDict complete = videoFormat();
+    EXPECT_EQ(push.addVideoStream(complete, nullptr), 0);
+    QvFrame other = makePicture(QvFourcc::YUYV, width, height), none;
+    EXPECT_EQ(push.writeFrame(&other, 0), QvStatus::invalidArgument);
+    EXPECT_EQ(push.writeFrame(&none, 0), QvStatus::invalidArgument);
+    EXPECT_THROW(push.writeFrame(&other, 1), QvAssertFailure);
+    QvPcm mono;
+    fillSound(mono, 10, 1, 2, 48000);
+    EXPECT_EQ(push.writeSamples(&mono, 0), QvStatus::invalidArgument);
+    EXPECT_THROW(push.writeSamples(&mono, -1), QvAssertFailure);
+    EXPECT_THROW(push.start(), QvAssertFailure);
+    EXPECT_EQ(push.open(), QvStatus::failed);  // without an encode pipe
+    EXPECT_EQ(push.close(false), 0);
+}
+
+// Before and after the start, while the worker waits for either kind, while it works, while others write; and
+// the same object goes on in a new run.
+TEST_F(Pushing, CloseAtEveryMoment) {
+    QvPushEncoder push;
+    EXPECT_EQ(push.close(true), 0);
+    add(push, true, true);
+    for (int moment = 0; moment < 10; ++moment) {
+        SCOPED_TRACE(moment);
+        ASSERT_EQ(push.open(), 0) << push.errorDesc();
+        EXPECT_THROW(push.open(), QvAssertFailure);
+        QvFrame frame = picture(1);
+        std::string sound;
+        std::atomic<bool> stop{false};
+        std::thread writer;
+        if (moment / 2 >= 1) {
+            ASSERT_EQ(push.start(), 0);
+        }
+        if (moment / 2 >= 2) {
+            EXPECT_EQ(push.writeFrame(&frame, 0), 0);
+        }
+        if (moment / 2 == 2) waitUntil(push, &QvPushEncoder::needsAudio);
+        if (moment / 2 == 3) writeSamples(push, 10000, 1, sound);
+        if (moment / 2 == 4)
+            writer = std::thread([&] {
+                QvFrame own = picture(2);
+                while (!stop) {
+                    push.writeFrame(&own, 0);
+                    writeSamples(push, 1602, 1, sound);
+                    if (sound.size() > (8u << 20)) break;
+                }
+            });
+        if (moment / 2 == 4) push.process();
+        EXPECT_EQ(push.close(moment % 2), 0) << push.errorDesc();
+        stop = true;
+        if (writer.joinable()) writer.join();
+        EXPECT_EQ(pipe_->close(), 0);
+        EXPECT_EQ(file("out.raw").size() % static_cast<size_t>(frame.total_bytes()), 0u);
+    }
+}
+
+TEST_F(Pushing, AFailingOutputIsTold) {
+    for (const auto how : {FailingOutputs::status, FailingOutputs::assertion}) {
+        cleanup_wrapper();
+        init_wrapper(nullptr);
+        FailingOutputs outputs;
+        outputs.how = how;
+        outputs.failAt = "rawvenc.write";
+        pipe_.reset(QvEncodePipe::create());
+        pipe_->clearStreams();
+        pipe_->setFilename(Any(folder_.file("out.x").c_str()));
+        QvPushEncoder push;
+        add(push, true, false);
+        ASSERT_EQ(push.open(), 0);
+        ASSERT_EQ(push.start(), 0);
+        QvFrame frame = picture(1);
+        int result = 0;
+        for (int i = 0; i < 1000 && result == 0; ++i) {
+            result = push.writeFrame(&frame, 0);
+            if (result == 0) push.process();
+        }
+        EXPECT_LT(result, 0);
+        EXPECT_NE(std::string(push.errorDesc()).find("rawvenc.write"), std::string::npos);
+        EXPECT_EQ(push.close(false), result);
+        pipe_->abort();
+        pipe_.reset();
+    }
+    pipe_.reset();
+    init_wrapper(nullptr);
+}
+
+}  // namespace
