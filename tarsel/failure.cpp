@@ -38,6 +38,15 @@ std::string suggestion(std::string_view unknown, const std::vector<std::string>&
     return text + "?";
 }
 
+std::string inLine(std::string text) {
+    std::replace(text.begin(), text.end(), '\n', ' ');
+    while (!text.empty() && (text.back() == ' ' || text.back() == '.')) text.pop_back();
+    const auto isSmall = [](char c) { return c == ' ' || (c >= 'a' && c <= 'z'); };
+    if (text.size() > 1 && text[0] >= 'A' && text[0] <= 'Z' && isSmall(text[1]))
+        text[0] = static_cast<char>(text[0] + ('a' - 'A'));
+    return text;
+}
+
 std::string inQuotes(std::string_view text) {
     std::string out = "'";
     for (const char c : text) {

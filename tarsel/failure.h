@@ -14,6 +14,7 @@ enum class Exit : int {
     output = 4,  // can't be written
     module = 5,  // a module is missing
     check = 6,   // the result is not what the job asked for
+    hangup = 129,
     interrupted = 130,
     terminated = 143,
 };
@@ -29,6 +30,10 @@ class Failure : public std::runtime_error {
 
 // " Did you mean 'a' or 'b'?" for an unknown name with near matches among the known ones, else "".
 std::string suggestion(std::string_view unknown, const std::vector<std::string>& known);
+
+// What the engine or the system said, as the rest of a line: it begins with a small letter unless with a name
+// or an abbreviation, and stays on the line.
+std::string inLine(std::string text);
 
 // A file name or text for a message: control characters and stray bytes are escaped, quotes are around it.
 std::string inQuotes(std::string_view text);

@@ -18,6 +18,8 @@ constexpr int kGap = 8;            // pixels between its pictures
 struct Given {
     std::string input, raw, at, output, sheet;
     bool overwrite = false;
+    std::shared_ptr<Outputs> outputs;
+    Signals* signals = nullptr;
 };
 
 const QvFrame& readAt(Source& source, long long frame) {
@@ -54,10 +56,18 @@ class Shrinker {
 };
 
 void save(const QvFrame& picture, const Given& given) {
-    Outputs outputs(given.output, {given.input}, given.overwrite);
+    Outputs& outputs = *given.outputs;
+    const Signals::Watch watch(*given.signals, nullptr, [&] { outputs.discard(); });
     const std::string name = outputs.begin("png");
-    if (QvImage::saveFrame(picture, Any(name.c_str()), 0) != 0)
-        throw Failure(Exit::output, "can't write " + inQuotes(given.output));
+    if (picture.four_cc() != QvFourcc::BGR3) makeAnyCodec("scaler", kVideoFilter);  // says that it is missing
+    qv_log()->clear();
+    if (QvImage::saveFrame(picture, Any(name.c_str()), 0) != 0) {
+        AnyVector messages;
+        qv_log()->getAll(messages);
+        const std::string reason = messages.empty() ? "" : messages.back().asDict().getString("text", "");
+        throw Failure(Exit::output, "can't write " + inQuotes(given.output) + ": " +
+                                        inLine(outputs.withFinalNames(reason)));
+    }
     outputs.commit("png");
 }
 
@@ -87,14 +97,15 @@ void saveSheet(Source& source, const Given& given, long long frames) {
     save(sheet, given);
 }
 
-void frame(const Given& given) {
-    Source source(given.input, given.raw);
-    if (source.decoder().nrStreams(1) == 0)
-        throw Failure(Exit::input, inQuotes(given.input) + " has no picture");
-    source.selectAll();
+void frame(Given& given) {
     const Any extension = QvFile::getExt(Any(given.output.c_str()), true);
     if (!(extension == "png"))
         throw Failure(Exit::usage, "-o " + inQuotes(given.output) + ": a picture is a .png file");
+    Source source(given.input, given.raw);
+    given.outputs = std::make_shared<Outputs>(given.output, "-o", std::vector{given.input}, given.overwrite);
+    if (source.decoder().nrStreams(1) == 0)
+        throw Failure(Exit::input, inQuotes(given.input) + " has no picture");
+    source.selectAll();
     const long long frames = source.decoder().nrFrames(0);
     if (!given.sheet.empty()) return saveSheet(source, given, frames);
     const auto rate = source.frameRate();
@@ -108,9 +119,10 @@ void frame(const Given& given) {
 
 }  // namespace
 
-void addFrame(CLI::App& app, Action& chosen, Signals&) {
+void addFrame(CLI::App& app, Action& chosen, Signals& signals) {
     CLI::App* command = app.add_subcommand("frame", "Save one picture of a video, or a contact sheet");
     auto given = std::make_shared<Given>();
+    given->signals = &signals;
     command->add_option("FILE", given->input, "A file, or testgen:...")->required();
     command->add_option("--at", given->at, "The instant: SS.mmm, HH:MM:SS, 120f, HH:MM:SS:FF")
         ->type_name("TIME");

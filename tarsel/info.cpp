@@ -3,6 +3,7 @@
 #include <nlohmann/json.hpp>
 
 #include "commands.h"
+#include "console.h"
 #include "failure.h"
 #include "source.h"
 #include "timespec.h"
@@ -64,8 +65,7 @@ Json describe(const Source& source) {
     Json file;
     file["file"] = validUtf8(source.name());
     file["decoder"] = source.decoder().name();
-    const Any bytes = source.decoder().QvCodec::getParam("filesize");
-    if (bytes.isInt()) file["bytes"] = bytes.toInt64();
+    if (source.bytes() >= 0) file["bytes"] = source.bytes();
     const double duration = source.duration();
     file["duration_s"] = duration < 0 ? Json(nullptr) : Json(duration);
     file["streams"] = Json::array();
@@ -77,58 +77,77 @@ Json describe(const Source& source) {
     return file;
 }
 
-void print(const Json& file) {
-    std::printf("%s\n", inQuotes(file["file"].get<std::string>()).c_str());
-    std::printf("  decoder   %s\n", file["decoder"].get<std::string>().c_str());
-    if (file.contains("bytes"))
-        std::printf("  size      %s\n", formatBytes(file["bytes"].get<long long>()).c_str());
-    if (!file["duration_s"].is_null())
-        std::printf("  duration  %s\n", formatTime(file["duration_s"].get<double>()).c_str());
-    for (const auto& s : file["streams"]) {
-        std::printf("  %s %lld  ", s["type"].get<std::string>().c_str(), s["number"].get<long long>());
-        bool first = true;
-        for (const auto& [key, value] : s.items()) {
-            if (key == "type" || key == "number") continue;
-            std::printf("%s%s %s", first ? "" : ", ", key.c_str(),
-                        value.is_string() ? value.get<std::string>().c_str() : value.dump().c_str());
-            first = false;
-        }
-        std::printf("\n");
+std::string streamLine(const Json& s) {
+    const auto number = [&](const char* key) { return std::to_string(s[key].get<long long>()); };
+    std::string line = s.value("codec", "");
+    const auto add = [&](const std::string& part) { line += (line.empty() ? "" : ", ") + part; };
+    if (s["type"] == "video") {
+        if (s["pixel"] != line) add(s["pixel"].get<std::string>());
+        if (s.contains("width") && s.contains("height")) add(number("width") + "x" + number("height"));
+        if (s.contains("rate")) add(s["rate"].get<std::string>() + " fps " + s["scan"].get<std::string>());
+        if (s.contains("frames")) add(number("frames") + " frames");
+        if (s.contains("views") && s["views"] != 1) add(number("views") + " views");
+    } else {
+        if (s.contains("samplerate")) add(number("samplerate") + " Hz");
+        if (s.contains("channels")) add(number("channels") + " ch");
+        if (s.contains("bits")) add(number("bits") + " bit");
+        if (s.contains("samples")) add(number("samples") + " samples");
     }
-    if (file.contains("damage")) std::printf("  damaged: %s\n", file["damage"].get<std::string>().c_str());
+    if (s.contains("duration_s")) add(formatTime(s["duration_s"].get<double>()));
+    return line;
+}
+
+void printFile(const Json& file) {
+    print("%s\n", inQuotes(file["file"].get<std::string>()).c_str());
+    print("  decoder   %s\n", file["decoder"].get<std::string>().c_str());
+    if (file.contains("bytes"))
+        print("  size      %s\n", formatBytes(file["bytes"].get<long long>()).c_str());
+    if (!file["duration_s"].is_null())
+        print("  duration  %s\n", formatTime(file["duration_s"].get<double>()).c_str());
+    for (const auto& s : file["streams"])
+        print("  %s %lld   %s\n", s["type"].get<std::string>().c_str(), s["number"].get<long long>(),
+              streamLine(s).c_str());
+    if (file.contains("damage")) print("  damaged   %s\n", file["damage"].get<std::string>().c_str());
+}
+
+struct Given {
+    std::vector<std::string> files;
+    std::string raw;
+    bool json = false;
+};
+
+// Looks at every file, also behind one that can't be used.
+void info(const Given& given) {
+    Json all = Json::array();
+    std::vector<std::string> failures;
+    for (const auto& name : given.files) {
+        try {
+            const Source source(name, given.raw);
+            all.push_back(describe(source));
+            if (!given.json) printFile(all.back());
+            if (all.back().contains("damage"))
+                failures.push_back(inQuotes(name) + " is damaged: " + source.damage());
+        } catch (const Failure& failure) {
+            if (failure.exit() != Exit::input) throw;
+            failures.push_back(failure.what());
+        }
+    }
+    if (given.json) print("%s\n", all.dump(2).c_str());
+    flushOutput();
+    if (failures.empty()) return;
+    for (size_t i = 0; i + 1 < failures.size(); ++i)
+        std::fprintf(stderr, "tarsel: %s\n", failures[i].c_str());
+    throw Failure(Exit::input, failures.back());
 }
 
 }  // namespace
 
 void addInfo(CLI::App& app, Action& chosen) {
     CLI::App* command = app.add_subcommand("info", "Show streams, formats and durations of files");
-    struct Given {
-        std::vector<std::string> files;
-        std::string raw;
-        bool json = false;
-    };
     auto given = std::make_shared<Given>();
     command->add_option("FILE", given->files, "Files, or testgen:...")->required();
     command->add_option("--raw", given->raw, "Format of a raw file: size=WxH,pixel=FORMAT,rate=R")
         ->type_name("K=V,...");
     command->add_flag("--json", given->json, "Print JSON, one array of files");
-    command->callback([&chosen, given] {
-        chosen = [given] {
-            Json all = Json::array();
-            std::string failed;
-            for (const auto& name : given->files) {
-                try {
-                    const Source source(name, given->raw);
-                    all.push_back(describe(source));
-                    if (!given->json) print(all.back());
-                } catch (const Failure& failure) {
-                    if (failure.exit() != Exit::input || given->files.size() == 1) throw;
-                    std::fprintf(stderr, "tarsel: %s\n", failure.what());
-                    failed = name;
-                }
-            }
-            if (given->json) std::printf("%s\n", all.dump(2).c_str());
-            if (!failed.empty()) throw Failure(Exit::input, "not all files could be opened");
-        };
-    });
+    command->callback([&chosen, given] { chosen = [given] { info(*given); }; });
 }

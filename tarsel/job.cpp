@@ -47,13 +47,25 @@ int intParam(const QvDecodePipe& decoder, int type, int stream, const char* name
     return value.isInt32() ? value.asInt32() : 0;
 }
 
+// The type of the streams that a filter of this name works on.
+int filterType(const std::string& name) {
+    const QvModule* module = qv_registry()->module(name.c_str());
+    const int kind = module ? module->getAttr("type").toInt32() : 0;
+    if (kind == kVideoFilter) return kVideo;
+    if (kind == kAudioFilter) return kAudio;
+    std::vector<std::string> known = moduleNames(kVideoFilter);
+    for (const auto& audio : moduleNames(kAudioFilter)) known.push_back(audio);
+    throw Failure(Exit::module, "--filter: there is no filter " + inQuotes(name) + "." +
+                                    suggestion(name, known) + " 'tarsel modules' lists all");
+}
+
 }  // namespace
 
-long long JobStream::bytes() const {
-    if (type == kAudio) return expected * channels * ((bits + 7) / 8);
+long long JobStream::bytes(long long units) const {
+    if (type == kAudio) return units * channels * ((bits + 7) / 8);
     QvFrame frame;
     if (frame.init(fourcc, width, height) != QvStatus::ok) return 0;
-    return expected * frame.total_bytes();
+    return units * frame.total_bytes();
 }
 
 Job::Job(const JobOptions& options, Signals& signals) : options_(options), signals_(signals) {
@@ -62,7 +74,9 @@ Job::Job(const JobOptions& options, Signals& signals) : options_(options), signa
     planStreams();
     planPoints();
     planLengths();
+    planFilters();
     buildPipe();
+    checkNames();
 }
 
 Job::~Job() = default;
@@ -76,7 +90,7 @@ void Job::chooseOutput() {
         kind_ = OutputKind::nothing;
         return;
     }
-    if (options_.output.empty()) throw Failure(Exit::usage, "no output; give one with -o FILE");
+    if (options_.output.empty()) throw Failure(Exit::usage, "no output; give its name with -o FILE");
     const std::string extension = QvFile::getExt(Any(options_.output.c_str()), true).asString();
     const auto* row = std::find_if(std::begin(kKinds), std::end(kKinds),
                                    [&](const KindRow& r) { return extension == r.extension; });
@@ -86,14 +100,16 @@ void Job::chooseOutput() {
     if (row == std::end(kKinds) && !device) {
         std::vector<std::string> known;
         for (const auto& r : kKinds) known.push_back(r.extension);
-        throw Failure(Exit::usage, "-o " + inQuotes(options_.output) + ": no output has the extension " +
-                                       inQuotes(extension) + "." + suggestion(extension, known) +
-                                       " 'tarsel formats' lists all");
+        throw Failure(Exit::usage,
+                      "-o " + inQuotes(options_.output) + ": " +
+                          (extension.empty() ? "it has no extension that says what to write"
+                                             : "no output has the extension " + inQuotes(extension)) +
+                          "." + suggestion(extension, known) + " 'tarsel formats' lists all");
     }
     kind_ = row == std::end(kKinds) ? OutputKind::raw : row->kind;
-    outputs_ = std::make_unique<Outputs>(options_.output, options_.inputs, options_.overwrite);
+    outputs_ = std::make_unique<Outputs>(options_.output, "-o", options_.inputs, options_.overwrite);
     if (kind_ == OutputKind::pictures) outputs_->checkNumbered("png");
-    if (options_.splitChannels && kind_ == OutputKind::wav) outputs_->checkNumbered("wav");
+    if (options_.splitChannels) outputs_->checkNumbered("wav");
 }
 
 void Job::openInputs() {
@@ -106,7 +122,7 @@ void Job::openInputs() {
 }
 
 // A cut input is refused unless the user takes what is there.
-void Job::checkDamage() const {
+void Job::checkDamage() {
     for (const auto& source : sources_) {
         const std::string damage = source->damage();
         if (damage.empty()) continue;
@@ -124,10 +140,18 @@ void Job::planStreams() {
             if (outputs_ && outputs_->isDevice() && !streams_.empty()) continue;
             for (int i = 0; i < source->decoder().nrStreams(type); ++i) planStream(*source, type, i);
         }
-    if (!streams_.empty()) return;
-    throw Failure(Exit::input, kind_ == OutputKind::wav
-                                   ? "no input has sound for " + inQuotes(options_.output)
-                                   : std::string("no input has a picture or sound"));
+    if (streams_.empty())
+        throw Failure(Exit::input, kind_ == OutputKind::wav
+                                       ? "no input has sound for " + inQuotes(options_.output)
+                                       : std::string("no input has a picture or sound"));
+    checkPicture();
+}
+
+void Job::checkPicture() const {
+    const bool sound = kind_ == OutputKind::wav || kind_ == OutputKind::nothing;
+    if (!sound && !hasVideo() && !outputs_->isDevice())
+        throw Failure(Exit::input, "no input has a picture for " + inQuotes(options_.output) +
+                                       "; sound alone is written as .wav");
 }
 
 void Job::planStream(Source& source, int type, int number) {
@@ -157,24 +181,22 @@ void Job::planStream(Source& source, int type, int number) {
 
 void Job::planPoints() {
     for (JobStream& stream : streams_) {
-        QvDecodePipe& decoder = stream.source->decoder();
         const auto rate = stream.source->frameRate();
-        const MediaTime length = decoder.duration(stream.type, stream.decStream);
+        const MediaTime length = stream.source->decoder().duration(stream.type, stream.decStream);
+        const std::string end =
+            "the end of " + inQuotes(stream.source->name()) + " (" + formatTime(length.seconds()) + ")";
         stream.in = MediaTime(0LL, kTicks);
         stream.out = length;
         if (!options_.from.empty()) stream.in = parseTime(options_.from, rate, "--from");
         if (!options_.to.empty()) stream.out = parseTime(options_.to, rate, "--to");
-        if (stream.out <= stream.in && !options_.to.empty() && !options_.from.empty())
-            throw Failure(Exit::usage, "--to " + options_.to + " is not behind --from " + options_.from);
-        if (stream.in >= length)
-            throw Failure(Exit::usage, "--from " + options_.from + " lies behind the end of " +
-                                           inQuotes(stream.source->name()) + " (" +
-                                           formatTime(length.seconds()) + ")");
+        if (stream.out <= stream.in && !options_.to.empty())
+            throw Failure(Exit::usage, "--to " + options_.to + " is not behind " +
+                                           (options_.from.empty() ? "the start" : "--from " + options_.from));
+        if (stream.in >= length && !options_.from.empty())
+            throw Failure(Exit::usage, "--from " + options_.from + " lies behind " + end);
         if (stream.out > length) {
             if (stream.type == kVideo || !hasVideo())
-                warnings_.push_back("--to " + options_.to + " lies behind the end of " +
-                                    inQuotes(stream.source->name()) + "; stopped at " +
-                                    formatTime(length.seconds()));
+                warnings_.push_back("--to " + options_.to + " lies behind " + end + "; stopped there");
             stream.out = length;
         }
     }
@@ -192,6 +214,10 @@ void Job::planLengths() {
             // A whole number of pairs goes into a halving.
             if (std::abs(2.0 * stream.rate.rate() - static_cast<double>(from)) < 1e-4 && stream.inUnits % 2)
                 stream.expected = (stream.inUnits + 1) / 2;
+            if (stream.expected < 1)
+                throw Failure(Exit::usage, "there is no frame of " + inQuotes(stream.source->name()) +
+                                               " between " + formatTime(stream.in.seconds()) + " and " +
+                                               formatTime(stream.out.seconds()));
             video = &stream;
         }
     }
@@ -259,27 +285,34 @@ void Job::addStream(JobStream& stream) {
     }
 }
 
-void Job::applyFilters(ProcessParams& params, int type) const {
-    FiltersState state;
-    bool any = false;
+// Names that exist are refused before any work; what is written beside the output counts as well.
+void Job::checkNames() const {
+    if (!outputs_ || outputs_->isDevice()) return;
+    pipe_->setFilename(Any(outputs_->hiddenName(primaryExtension()).c_str()));
+    const Any names = pipe_->getMuxer()->QvCodec::getParam("filenames");
+    if (!names.isVector()) return;
+    for (int i = 0; i < names.asVector().size(); ++i)
+        outputs_->checkFinal(outputs_->finalName(names.asVector().at(i).asString(), "raw"));
+}
+
+void Job::planFilters() {
+    for (JobStream& stream : streams_) stream.params.setInOutPoints(InOutPoints(stream.in, stream.out));
+    FiltersState states[2];
     for (const auto& spec : options_.filters) {
         const size_t colon = spec.find(':');
-        const std::string name = spec.substr(0, colon);
-        const QvModule* module = qv_registry()->module(name.c_str());
-        const int kind = module ? module->getAttr("type").toInt32() : 0;
-        if (kind != kVideoFilter && kind != kAudioFilter)
-            makeAnyCodec(name, kVideoFilter);  // says what is wrong
-        if (kind != (type == kVideo ? kVideoFilter : kAudioFilter)) continue;
-        const auto filter = makeAnyCodec(name, kind);
-        const KeyValues keys(colon == std::string::npos ? "" : spec.substr(colon + 1), {},
-                             "--filter " + name);
+        const std::string name = spec.substr(0, colon), option = "--filter " + name;
+        const int type = filterType(name);
+        if (std::none_of(streams_.begin(), streams_.end(), [&](const auto& s) { return s.type == type; }))
+            throw Failure(Exit::usage,
+                          option + ": this job has no " + (type == kVideo ? "picture" : "sound"));
+        const auto filter = makeAnyCodec(name, type == kVideo ? kVideoFilter : kAudioFilter);
+        const KeyValues keys(colon == std::string::npos ? "" : spec.substr(colon + 1), {}, option);
+        for (const auto& [key, value] : keys.all()) setChecked(*filter, key, valueOf(value), option);
         AnyDict stored;
-        for (const auto& [key, value] : keys.all())
-            setChecked(*filter, key, valueOf(value), "--filter " + name);
         filter->store(stored);
         stored.set("_on", 1);
-        state.appendFilter(name.c_str(), stored);
-        any = true;
+        states[type - 1].appendFilter(name.c_str(), stored);
     }
-    if (any) params.setFilters(state);
+    for (JobStream& stream : streams_)
+        if (!states[stream.type - 1].empty()) stream.params.setFilters(states[stream.type - 1]);
 }

@@ -17,7 +17,7 @@
 
 struct JobOptions {
     std::vector<std::string> inputs;
-    std::string output, raw, from, to, muxer, saveTask;
+    std::string output, raw, from, to, muxer, post, saveTask;
     std::optional<Size> size;
     std::optional<QvFramerate> rate;
     std::optional<unsigned> pixel;
@@ -40,11 +40,12 @@ struct JobStream {
     unsigned fourcc = 0;
     QvFramerate rate;
     int samplerate = 0, channels = 0, bits = 0;
-    MediaTime in, out;        // in the source
-    long long inUnits = 0;    // frames or samples between the points
-    long long expected = 0;   // frames or samples of the output
-    long long written = -1;   // after the run
-    long long bytes() const;  // of `expected`, without headers
+    MediaTime in, out;       // in the source
+    long long inUnits = 0;   // frames or samples between the points
+    long long expected = 0;  // frames or samples of the output
+    long long written = -1;  // after the run
+    ProcessParams params;
+    long long bytes(long long units) const;  // without headers
 };
 
 class Job {
@@ -54,7 +55,7 @@ class Job {
 
     // Prints the plan to the standard output.
     void printPlan() const;
-    void saveTask() const;
+    void saveTask();
     // Runs, checks and commits. Throws Failure.
     void run();
 
@@ -67,13 +68,22 @@ class Job {
     void planStream(Source& source, int type, int number);
     void planPoints();
     void planLengths();
+    void planFilters();
+    void checkPicture() const;
     void buildPipe();
     void addStream(JobStream& stream);
-    void applyFilters(ProcessParams& params, int type) const;
-    void checkDamage() const;
+    void checkNames() const;
+    void checkDamage();
     void checkSpace() const;
-    void checkResult(const std::vector<std::string>& names) const;
+    void link(Runner& runner) const;
+    int runLinked(Runner& runner, Progress& progress);
+    [[noreturn]] void stopped(Exit signalled) const;
     [[noreturn]] void fail(Runner& runner) const;
+    void checkResult();
+    void checkFiles() const;
+    void report(const std::vector<std::string>& names) const;
+    void runPost(const std::vector<std::string>& names) const;
+    void showWarnings() const;
     std::string primaryExtension() const;
     bool hasVideo() const;
 
@@ -82,7 +92,7 @@ class Job {
     OutputKind kind_ = OutputKind::raw;
     std::vector<std::unique_ptr<Source>> sources_;
     std::vector<JobStream> streams_;
-    std::unique_ptr<Outputs> outputs_;
+    std::unique_ptr<Outputs> outputs_, taskFile_;
     std::unique_ptr<QvEncodePipe> pipe_;
-    mutable std::vector<std::string> warnings_;
+    std::vector<std::string> warnings_;
 };

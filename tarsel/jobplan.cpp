@@ -2,6 +2,7 @@
 #include <cstdio>
 #include <string>
 
+#include "console.h"
 #include "job.h"
 #include "timespec.h"
 
@@ -19,21 +20,19 @@ std::string formatOf(const JobStream& s) {
 
 void Job::printPlan() const {
     for (const auto& source : sources_)
-        std::printf("input   %s  %s\n", inQuotes(source->name()).c_str(),
-                    formatTime(source->duration()).c_str());
+        print("input   %s  %s\n", inQuotes(source->name()).c_str(), formatTime(source->duration()).c_str());
     long long total = 0;
     for (const JobStream& s : streams_) {
-        std::printf("stream  %s %d of %s, %s to %s\n", s.type == 1 ? "video" : "audio", s.decStream,
-                    inQuotes(s.source->name()).c_str(), formatTime(s.in.seconds()).c_str(),
-                    formatTime(s.out.seconds()).c_str());
-        for (const auto& filter : options_.filters) std::printf("filter  %s\n", filter.c_str());
-        std::printf("encoder %s: %s\n", pipe_->encoder(s.type, s.encStream)->name(), formatOf(s).c_str());
-        std::printf("expect  %lld %s, %lld bytes\n", s.expected, s.type == 1 ? "frames" : "samples",
-                    s.bytes());
-        total += s.bytes();
+        print("stream  %s %d of %s, %s to %s\n", s.type == 1 ? "video" : "audio", s.decStream,
+              inQuotes(s.source->name()).c_str(), formatTime(s.in.seconds()).c_str(),
+              formatTime(s.out.seconds()).c_str());
+        for (const auto& filter : options_.filters) print("filter  %s\n", filter.c_str());
+        print("encoder %s: %s\n", pipe_->encoder(s.type, s.encStream)->name(), formatOf(s).c_str());
+        print("expect  %lld %s, %lld bytes\n", s.expected, s.type == 1 ? "frames" : "samples",
+              s.bytes(s.expected));
+        total += s.bytes(s.expected);
     }
-    std::printf("output  %s by %s, %s\n",
-                outputs_ ? inQuotes(outputs_->output().string()).c_str() : "nothing",
-                pipe_->getMuxer()->name(), formatBytes(total).c_str());
-    for (const auto& warning : warnings_) std::fprintf(stderr, "tarsel: warning: %s\n", warning.c_str());
+    print("output  %s by %s, %s\n", outputs_ ? inQuotes(outputs_->output().string()).c_str() : "nothing",
+          pipe_->getMuxer()->name(), formatBytes(total).c_str());
+    showWarnings();
 }

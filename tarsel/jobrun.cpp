@@ -1,15 +1,14 @@
-// Running a job: the transcoder with its callbacks, what is shown meanwhile, and the checks afterwards.
+// Running a job: the transcoder with its callbacks, what is shown meanwhile, and how it ends.
 #include <algorithm>
 #include <atomic>
 #include <condition_variable>
-#include <filesystem>
+#include <cstdio>
 #include <mutex>
 
 #include "job.h"
 #include "keyboard.h"
+#include "post.h"
 #include "timespec.h"
-
-namespace fs = std::filesystem;
 
 // The transcoder of a job. Its callbacks run on the engine's worker; the tool waits on its own thread.
 class Job::Runner : public QvTranscoder {
@@ -32,7 +31,7 @@ class Job::Runner : public QvTranscoder {
         return 0;
     }
 
-    void cbPaused(bool paused) override { progress_.update(state(paused ? "paused" : "running")); }
+    void cbPaused(bool paused) override { progress_.show(state(paused ? "paused" : "running")); }
 
     void cbDone(int result) override {
         std::lock_guard guard(lock_);
@@ -41,14 +40,22 @@ class Job::Runner : public QvTranscoder {
         changed_.notify_all();
     }
 
-    int wait() {
+    // The result of cbDone. `slow` runs when a requested stop takes a while.
+    template <class Slow>
+    int wait(Slow slow) {
         std::unique_lock guard(lock_);
+        changed_.wait(guard, [this] { return done_ || stop_; });
+        if (!done_ && !changed_.wait_for(guard, kSlowStop, [this] { return done_; })) slow();
         changed_.wait(guard, [this] { return done_; });
         return result_;
     }
 
     void requestStop() {
-        stop_ = true;
+        {
+            std::lock_guard guard(lock_);
+            stop_ = true;
+            changed_.notify_all();
+        }
         if (isPaused()) unpause();
     }
 
@@ -74,6 +81,8 @@ class Job::Runner : public QvTranscoder {
     const ProgressState& last() const { return last_; }
 
   private:
+    static constexpr auto kSlowStop = std::chrono::seconds(1);
+
     Job& job_;
     Progress& progress_;
     ProgressState last_;
@@ -85,76 +94,80 @@ class Job::Runner : public QvTranscoder {
 };
 
 void Job::checkSpace() const {
-    if (!outputs_) return;
-    const long long space = QvFile::freeSpace(Any(outputs_->output().c_str()));
+    if (!outputs_ || outputs_->isDevice()) return;
+    const long long space = QvFile::freeSpace(Any(outputs_->hiddenName(primaryExtension()).c_str()));
     long long need = 0;
     if (kind_ != OutputKind::pictures)
-        for (const JobStream& stream : streams_) need += stream.bytes();
-    if (space >= 0 && need > space && fs::is_directory(fs::absolute(outputs_->output()).parent_path()))
+        for (const JobStream& stream : streams_) need += stream.bytes(stream.expected);
+    if (space >= 0 && need > space)
         throw Failure(Exit::output, "can't write " + inQuotes(outputs_->output().string()) + ": it needs " +
                                         formatBytes(need) + ", the disk has " + formatBytes(space) + " free");
 }
 
-void Job::run() {
-    checkSpace();
-    Progress progress(options_.quiet ? ProgressMode::off : options_.progress, "");
-    Runner runner(*this, progress);
+void Job::link(Runner& runner) const {
     runner.setEncoder(pipe_.get());
     runner.setParam("startDelay", 0);
     AnyDict off;
     off.set("off", 1);
     runner.setParam("progress", off);
-    for (JobStream& s : streams_) {
-        ProcessParams params;
-        params.setInOutPoints(InOutPoints(s.in, s.out));
-        applyFilters(params, s.type);
-        if (runner.link(&s.source->decoder(), s.type, s.decStream, s.encStream, params) < 0)
-            throw Failure(Exit::failed, runner.errorDesc());
-    }
-    signals_.watch([&] { runner.requestStop(); },
-                   [&] {
-                       if (outputs_) outputs_->discard();
-                   });
+    for (const JobStream& s : streams_)
+        if (runner.link(&s.source->decoder(), s.type, s.decStream, s.encStream, s.params) < 0)
+            throw Failure(Exit::failed, inLine(runner.errorDesc()));
+}
+
+int Job::runLinked(Runner& runner, Progress& progress) {
     if (outputs_) pipe_->setFilename(Any(outputs_->begin(primaryExtension()).c_str()));
     progress.start();
     qv_log()->clear();
     int result = runner.transcode(false);
     if (result == QvStatus::ok || result == QvStatus::warning) {
         Keyboard keyboard(progress.onTerminal(), [&] { runner.togglePause(); });
-        result = runner.wait();
+        result = runner.wait([&] {
+            if (!options_.quiet) std::fputs("tarsel: stopping; a second signal ends it at once\n", stderr);
+        });
     }
-    signals_.unwatch();
     ProgressState end = runner.last();
-    const Exit signalled = signals_.received();
-    end.state = signalled != Exit::done ? "stopped" : result == 0 ? "done" : "failed";
+    end.state = signals_.received() != Exit::done ? "stopped" : result == 0 ? "done" : "failed";
     progress.finish(end);
-    if (signalled != Exit::done) {
-        if (outputs_) outputs_->discard();
-        throw Failure(signalled, "stopped; nothing was left behind");
-    }
-    if (result != 0) fail(runner);
+    return result;
+}
+
+void Job::run() {
+    checkSpace();
+    Progress progress(options_.quiet ? ProgressMode::off : options_.progress, "task 1 of 1  ");
     std::vector<std::string> names;
-    checkResult(names);
-    if (outputs_) names = outputs_->commit("raw");
-    for (const auto& warning : warnings_) std::fprintf(stderr, "tarsel: warning: %s\n", warning.c_str());
-    if (options_.quiet) return;
-    std::string where = names.empty() ? "nothing" : inQuotes(names.front());
-    if (names.size() > 1)
-        where += names.size() == 2 ? " and " + inQuotes(names[1])
-                                   : " and " + std::to_string(names.size() - 1) + " more files";
-    std::fprintf(stderr, "tarsel: wrote %s", where.c_str());
-    for (const JobStream& s : streams_)
-        std::fprintf(stderr, ", %lld %s", s.written, s.type == 1 ? "frames" : "samples");
-    std::fprintf(stderr, "%s\n",
-                 warnings_.empty() ? "" : (" (" + std::to_string(warnings_.size()) + " warnings)").c_str());
+    {
+        Runner runner(*this, progress);
+        link(runner);
+        const Signals::Watch watch(
+            signals_, [&] { runner.requestStop(); },
+            [&] {
+                if (outputs_) outputs_->discard();
+            });
+        const int result = runLinked(runner, progress);
+        if (const Exit signalled = signals_.received(); signalled != Exit::done) stopped(signalled);
+        if (result != 0) fail(runner);
+        checkResult();
+        if (outputs_) names = outputs_->commit("raw");
+    }
+    showWarnings();
+    if (!options_.quiet) report(names);
+    if (!options_.post.empty()) runPost(names);
+}
+
+void Job::stopped(Exit signalled) const {
+    if (outputs_) outputs_->discard();
+    const bool device = outputs_ && outputs_->isDevice();
+    throw Failure(signalled, device ? "stopped; " + inQuotes(options_.output) + " has a part of it"
+                                    : "stopped; nothing was left behind");
 }
 
 // The reason stands in the object that failed: a decoder, or one of the output's members.
 void Job::fail(Runner& runner) const {
     for (const auto& source : sources_)
         if (source->decoder().errorCode() < 0 && source->decoder().errorCode() != QvStatus::endOfStream)
-            throw Failure(Exit::input,
-                          "can't read " + inQuotes(source->name()) + ": " + source->decoder().errorDesc());
+            throw Failure(Exit::input, "can't read " + inQuotes(source->name()) + ": " +
+                                           inLine(source->decoder().errorDesc()));
     std::string reason;
     const auto take = [&](const QvCodec* codec) {
         if (reason.empty() && codec && codec->errorCode() != 0) reason = codec->errorDesc();
@@ -168,33 +181,36 @@ void Job::fail(Runner& runner) const {
     take(pipe_->sink());
     for (const JobStream& s : streams_) take(pipe_->encoder(s.type, s.encStream));
     take(pipe_.get());
-    if (reason.empty()) throw Failure(Exit::failed, runner.errorDesc());
+    if (reason.empty()) throw Failure(Exit::failed, inLine(runner.errorDesc()));
     if (outputs_) reason = outputs_->withFinalNames(reason);
-    throw Failure(Exit::output,
-                  (outputs_ ? "can't write " + inQuotes(outputs_->output().string()) + ": " : "") + reason);
+    throw Failure(
+        Exit::output,
+        (outputs_ ? "can't write " + inQuotes(outputs_->output().string()) + ": " : "") + inLine(reason));
 }
 
-// Compares what was written with what the job asked for; an input that ended early is told apart.
-void Job::checkResult(const std::vector<std::string>&) const {
-    for (const JobStream& s : streams_) {
-        if (s.written >= s.expected) continue;
-        const char* unit = s.type == 1 ? "frames" : "samples";
-        const std::string line = inQuotes(s.source->name()) + " ended early: " + std::to_string(s.written) +
-                                 " of " + std::to_string(s.expected) + " " + unit + " were read";
-        if (!options_.acceptPartial)
-            throw Failure(Exit::input, line + "; --accept-partial keeps what is there");
-        warnings_.push_back(line);
-    }
-    const JobStream* first = &streams_.front();
-    if (!outputs_ || kind_ != OutputKind::raw || first->type != 1) return;
-    std::error_code error;
-    const Any name = pipe_->getMuxer()->QvCodec::getParam("filenames");
-    if (!name.isVector() || name.asVector().empty() ||
-        !fs::is_regular_file(name.asVector().at(0).asString(), error))
-        return;
-    const auto bytes = static_cast<long long>(fs::file_size(name.asVector().at(0).asString(), error));
-    const long long wanted = first->expected > 0 ? first->bytes() / first->expected * first->written : 0;
-    if (bytes != wanted)
-        throw Failure(Exit::check, inQuotes(options_.output) + " has " + std::to_string(bytes) +
-                                       " bytes instead of " + std::to_string(wanted));
+void Job::showWarnings() const {
+    if (options_.quiet) return;
+    for (const auto& warning : warnings_) std::fprintf(stderr, "tarsel: warning: %s\n", warning.c_str());
+}
+
+void Job::report(const std::vector<std::string>& names) const {
+    std::string line = "wrote " + (names.empty() ? "nothing" : inQuotes(names.front()));
+    if (names.size() == 2) line += " and " + inQuotes(names[1]);
+    if (names.size() > 2) line += " and " + std::to_string(names.size() - 1) + " more files";
+    for (const JobStream& s : streams_)
+        line += ", " + std::to_string(s.written) + (s.type == 1 ? " frame" : " sample") +
+                (s.written == 1 ? "" : "s");
+    if (!warnings_.empty())
+        line +=
+            " (" + std::to_string(warnings_.size()) + (warnings_.size() == 1 ? " warning)" : " warnings)");
+    std::fprintf(stderr, "tarsel: %s\n", line.c_str());
+}
+
+void Job::runPost(const std::vector<std::string>& names) const {
+    const int status = execute_process(Any(postCommand(options_.post, options_.inputs, names).c_str()));
+    if (status == 0) return;
+    throw Failure(Exit::failed, "the command of --post " +
+                                    (status < 0 ? std::string("can't be run")
+                                                : "ended with status " + std::to_string(status)) +
+                                    (names.empty() ? "" : "; " + inQuotes(names.front()) + " is complete"));
 }

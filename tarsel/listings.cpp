@@ -1,10 +1,10 @@
 // What this installation can do: modules, presets and formats.
-#include <cstdio>
 #include <map>
 
 #include <nlohmann/json.hpp>
 
 #include "commands.h"
+#include "console.h"
 #include "timespec.h"
 
 namespace {
@@ -65,14 +65,15 @@ Json presets() {
 struct Output {
     const char* extensions;
     const char* what;
+    const char* module;  // what it needs
 };
 
 constexpr Output kOutputs[] = {
-    {"wav", "PCM sound, 8 to 24 bits, 1 to 8 channels"},
-    {"png", "one picture a frame, NAME#0.png; sound beside them in NAME.wav"},
+    {"wav", "PCM sound, 8 to 24 bits, 1 to 8 channels", "rawmux"},
+    {"png", "one picture a frame, NAME#0.png; sound beside them in NAME.wav", "scaler"},
     {"raw yuv rgb i420 yv12 yuy2 yuyv uyvy bgr3 bgr4 bgra argb v210",
-     "raw frames one behind the other; sound beside them in NAME.wav"},
-    {"avi", "uncompressed pictures and sound in one file"},
+     "raw frames one behind the other; sound beside them in NAME.wav", "rawmux"},
+    {"avi", "uncompressed pictures and sound in one file", "rawavimux"},
 };
 
 Json formats() {
@@ -92,11 +93,11 @@ Json formats() {
     result["inputs"] = inputs;
     result["outputs"] = Json::array();
     for (const Output& output : kOutputs)
-        result["outputs"].push_back({{"extensions", output.extensions}, {"description", output.what}});
+        if (std::unique_ptr<QvCodec>(qv_registry()->newCodec(output.module)))
+            result["outputs"].push_back({{"extensions", output.extensions}, {"description", output.what}});
     result["pixels"] = Json::array();
-    for (const QvPixelFormat& format : qvPixelFormats()) {
+    for (const QvPixelFormat& format : qvPixelFormats())
         result["pixels"].push_back({{"fourcc", fourccText(format.fourcc)}});
-    }
     return result;
 }
 
@@ -107,17 +108,17 @@ std::string joined(const Json& list) {
 }
 
 void add(CLI::App& app, Action& chosen, const char* name, const char* help, Json (*make)(),
-         void (*print)(const Json&)) {
+         void (*show)(const Json&)) {
     CLI::App* command = app.add_subcommand(name, help);
     auto json = std::make_shared<bool>(false);
     command->add_flag("--json", *json, "Print JSON");
-    command->callback([&chosen, json, make, print] {
-        chosen = [json, make, print] {
+    command->callback([&chosen, json, make, show] {
+        chosen = [json, make, show] {
             const Json data = make();
             if (*json)
-                std::printf("%s\n", data.dump(2).c_str());
+                print("%s\n", data.dump(2).c_str());
             else
-                print(data);
+                show(data);
         };
     });
 }
@@ -128,9 +129,9 @@ void addModules(CLI::App& app, Action& chosen) {
     add(app, chosen, "modules", "List the modules of the library and its plug-ins", modules,
         [](const Json& list) {
             for (const auto& m : list)
-                std::printf("%-13s %-14s %s%s\n", m["name"].get<std::string>().c_str(),
-                            m["kind"].get<std::string>().c_str(), m["description"].get<std::string>().c_str(),
-                            m["usable"].get<bool>() ? "" : "  (not usable)");
+                print("%-13s %-14s %s%s\n", m["name"].get<std::string>().c_str(),
+                      m["kind"].get<std::string>().c_str(), m["description"].get<std::string>().c_str(),
+                      m["usable"].get<bool>() ? "" : "  (not usable)");
         });
 }
 
@@ -138,24 +139,23 @@ void addPresets(CLI::App& app, Action& chosen) {
     add(app, chosen, "presets", "List the presets that the installed modules allow", presets,
         [](const Json& list) {
             for (const auto& p : list)
-                std::printf("%-24s video %s; audio %s; %s\n", p["name"].get<std::string>().c_str(),
-                            joined(p["video"]).c_str(), joined(p["audio"]).c_str(),
-                            joined(p["muxers"]).c_str());
+                print("%-24s video %s; audio %s; %s\n", p["name"].get<std::string>().c_str(),
+                      joined(p["video"]).c_str(), joined(p["audio"]).c_str(), joined(p["muxers"]).c_str());
         });
 }
 
 void addFormats(CLI::App& app, Action& chosen) {
     add(app, chosen, "formats", "List what can be read and written", formats, [](const Json& data) {
-        std::printf("Inputs\n");
+        print("Inputs\n");
         for (const auto& i : data["inputs"])
-            std::printf("  %-10s %s: %s\n", i["decoder"].get<std::string>().c_str(),
-                        i["description"].get<std::string>().c_str(), joined(i["extensions"]).c_str());
-        std::printf("Outputs\n");
+            print("  %-10s %s: %s\n", i["decoder"].get<std::string>().c_str(),
+                  i["description"].get<std::string>().c_str(), joined(i["extensions"]).c_str());
+        print("Outputs\n");
         for (const auto& o : data["outputs"])
-            std::printf("  %s\n      %s\n", o["extensions"].get<std::string>().c_str(),
-                        o["description"].get<std::string>().c_str());
-        std::printf("Pixel formats\n ");
-        for (const auto& p : data["pixels"]) std::printf(" %s", p["fourcc"].get<std::string>().c_str());
-        std::printf("\n");
+            print("  %s\n      %s\n", o["extensions"].get<std::string>().c_str(),
+                  o["description"].get<std::string>().c_str());
+        print("Pixel formats\n ");
+        for (const auto& p : data["pixels"]) print(" %s", p["fourcc"].get<std::string>().c_str());
+        print("\n");
     });
 }

@@ -5,11 +5,13 @@
 #include <cstdlib>
 #include <memory>
 #include <new>
+#include <sstream>
 
 #include <qvplugcore/qvplugcore.h>
 #include <CLI/CLI.hpp>
 
 #include "commands.h"
+#include "console.h"
 #include "failure.h"
 #include "signals.h"
 
@@ -38,26 +40,34 @@ std::vector<std::string> subcommandNames(const CLI::App& app) {
 int status(Exit exit) { return static_cast<int>(exit); }
 
 int say(Exit exit, const std::string& line) {
-    std::fprintf(stderr, "tarsel: %s\n", line.c_str());
+    if (!line.empty()) std::fprintf(stderr, "tarsel: %s\n", line.c_str());
     return status(exit);
 }
 
-// Wrong use: the parser's words, with near matches for an unknown command or option.
-int wrongUse(const CLI::App& app, const CLI::ParseError& error, int argc, char** argv) {
-    std::string line = error.what();
-    for (auto& c : line)
-        if (c == '\n') c = ' ';
+// The parser's words for what was given too much.
+std::string unexpected(const CLI::App& used, const std::vector<std::string>& known) {
+    const std::vector<std::string> words = used.remaining(true);
+    if (words.empty()) return "there is a word too many";
+    const std::string word = words.front().substr(0, words.front().find('='));
+    const bool option = word.size() > 1 && word[0] == '-';
+    return std::string("unknown ") + (option ? "option " : "argument ") + inQuotes(word) + "." +
+           suggestion(word, known);
+}
+
+// Wrong use: what the parser says, with near matches for an unknown option.
+int wrongUse(const CLI::App& app, const CLI::ParseError& error) {
     const CLI::App* used = &app;
     for (const CLI::App* sub : app.get_subcommands()) used = sub;
     std::vector<std::string> known = used == &app ? subcommandNames(app) : std::vector<std::string>();
     for (const CLI::Option* option : used->get_options())
         for (const auto& name : option->get_lnames()) known.push_back("--" + name);
-    for (int i = 1; i < argc; ++i) {
-        const std::string word = std::string(argv[i]).substr(0, std::string(argv[i]).find('='));
-        if (line.find(word) != std::string::npos &&
-            std::find(known.begin(), known.end(), word) == known.end())
-            line += suggestion(word, known);
-    }
+    std::string line;
+    if (dynamic_cast<const CLI::ExtrasError*>(&error))
+        line = unexpected(*used, known);
+    else if (used == &app)
+        line = "give a command.";
+    else
+        line = inLine(error.what()) + ".";
     const std::string help = used == &app ? "tarsel --help" : "tarsel " + used->get_name() + " --help";
     return say(Exit::usage, line + " See '" + help + "'");
 }
@@ -76,10 +86,7 @@ void checkCommand(const CLI::App& app, int argc, char** argv) {
     }
 }
 
-}  // namespace
-
-int main(int argc, char** argv) {
-    std::setlocale(LC_ALL, "C");
+int run(int argc, char** argv) {
     Signals signals;
     CLI::App app("Transcodes, inspects and draws media from the command line.", "tarsel");
     app.require_subcommand(1);
@@ -101,25 +108,34 @@ int main(int argc, char** argv) {
         checkCommand(app, argc, argv);
         app.parse(argc, argv);
     } catch (const CLI::Success& shown) {
-        return app.exit(shown);
-    } catch (const CLI::ParseError& error) {
-        return wrongUse(app, error, argc, argv);
-    } catch (const Failure& failure) {
-        return say(failure.exit(), failure.what());
-    }
-    try {
-        Engine engine(log, plugins);
-        chosen();
-        if (std::fflush(stdout) != 0 || std::ferror(stdout))
-            return say(Exit::output, "can't write to the standard output");
+        std::ostringstream text;
+        app.exit(shown, text, text);
+        printText(text.str());
+        flushOutput();
         return status(Exit::done);
+    } catch (const CLI::ParseError& error) {
+        return wrongUse(app, error);
+    }
+    Engine engine(log, plugins);
+    chosen();
+    flushOutput();
+    return status(Exit::done);
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+    std::setlocale(LC_ALL, "C");
+    claimStreams();
+    try {
+        return run(argc, argv);
     } catch (const Failure& failure) {
         return say(failure.exit(), failure.what());
     } catch (const QvException& failure) {
-        return say(Exit::failed, failure.what());
+        return say(Exit::failed, inLine(failure.what()));
     } catch (const std::bad_alloc&) {
         return say(Exit::failed, "out of memory");
     } catch (const std::exception& failure) {
-        return say(Exit::failed, failure.what());
+        return say(Exit::failed, inLine(failure.what()));
     }
 }

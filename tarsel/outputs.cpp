@@ -2,9 +2,10 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <cstdio>
 #include <cstring>
-#include <regex>
 
+#include <fcntl.h>
 #include <stdlib.h>
 #include <unistd.h>
 
@@ -13,6 +14,9 @@
 namespace fs = std::filesystem;
 
 namespace {
+
+// Of the files in the hidden folder; whatever the final name holds, the engine handles this one.
+const std::string kBase = "out";
 
 fs::path folderOf(const fs::path& name) {
     return name.has_parent_path() ? name.parent_path() : fs::path(".");
@@ -27,18 +31,68 @@ bool sameFile(const fs::path& a, const fs::path& b) {
     return fs::equivalent(a, b, error) && !error;
 }
 
+// The standard output may be a plain file that the shell has opened: it is written as a stream all the same.
+bool takesStream(const fs::path& name) {
+    std::error_code error;
+    const auto status = fs::status(name, error);
+    if (!fs::exists(status) || fs::is_directory(status)) return false;
+    return !fs::is_regular_file(status) || name.string().rfind("/dev/", 0) == 0;
+}
+
+void checkFolder(const fs::path& name) {
+    const fs::path folder = folderOf(name);
+    std::error_code error;
+    const auto status = fs::status(folder, error);
+    const std::string quoted = inQuotes(folder.string());
+    if (fs::is_directory(status)) {
+        if (::access(folder.c_str(), W_OK | X_OK) != 0)
+            refuse(name, "the folder " + quoted + " may not be written");
+    } else if (fs::exists(status)) {
+        refuse(name, quoted + " is no folder");
+    } else if (status.type() == fs::file_type::none) {
+        refuse(name, inLine(error.message()));
+    } else {
+        refuse(name, "the folder " + quoted + " does not exist");
+    }
+}
+
+struct Placed {
+    fs::path hidden, final;
+    bool exchanged;  // what stood there before has the hidden name
+};
+
+// In one step, so that there is never a moment without either file.
+bool place(const fs::path& file, const fs::path& name, bool overwrite) {
+    const auto rename = [&](unsigned flags) {
+        return renameat2(AT_FDCWD, file.c_str(), AT_FDCWD, name.c_str(), flags) == 0;
+    };
+    if (overwrite && rename(RENAME_EXCHANGE)) return true;
+    if (!overwrite || errno == ENOENT) {
+        if (rename(RENAME_NOREPLACE)) return false;
+        if (errno == EEXIST) refuse(name, "it exists; use -y to overwrite it");
+    }
+    // Some file systems know none of the two.
+    if (errno == EINVAL && rename(0)) return false;
+    refuse(name, inLine(std::strerror(errno)));
+}
+
+void takeBack(const Placed& placed) {
+    renameat2(AT_FDCWD, placed.final.c_str(), AT_FDCWD, placed.hidden.c_str(),
+              placed.exchanged ? RENAME_EXCHANGE : 0);
+}
+
 }  // namespace
 
-Outputs::Outputs(const std::string& output, const std::vector<std::string>& inputs, bool overwrite)
-    : output_(output), inputs_(inputs), overwrite_(overwrite) {
+Outputs::Outputs(const std::string& output, const std::string& option, const std::vector<std::string>& inputs,
+                 bool overwrite)
+    : output_(output), inputs_(inputs), overwrite_(overwrite), device_(takesStream(output)) {
     std::error_code error;
-    if (output.empty()) throw Failure(Exit::usage, "-o: the name of the output is empty");
+    if (output.empty()) throw Failure(Exit::usage, option + ": the name of the output is empty");
+    // The engine takes both slashes for separators.
+    if (folderOf(output_).string().find('\\') != std::string::npos)
+        refuse(output_, "a backslash can't stand in the name of the folder");
     if (fs::is_directory(output_, error)) refuse(output_, "this is a folder; give a file name in it");
-    const fs::path folder = folderOf(output_);
-    if (!fs::is_directory(folder, error))
-        refuse(output_, "the folder " + inQuotes(folder.string()) + " does not exist");
-    if (::access(folder.c_str(), W_OK | X_OK) != 0)
-        refuse(output_, "the folder " + inQuotes(folder.string()) + " may not be written");
+    checkFolder(output_);
     checkFinal(output_);
 }
 
@@ -48,8 +102,10 @@ void Outputs::checkFinal(const fs::path& name) const {
     for (const auto& input : inputs_)
         if (sameFile(input, name)) refuse(name, "it is also an input");
     std::error_code error;
-    if (!overwrite_ && fs::exists(fs::symlink_status(name, error)))
-        refuse(name, "it exists; use -y to overwrite it");
+    const auto status = fs::symlink_status(name, error);
+    if (error && status.type() == fs::file_type::none) refuse(name, inLine(error.message()));
+    if (!overwrite_ && !device_ && fs::exists(status)) refuse(name, "it exists; use -y to overwrite it");
+    if (!device_ && fs::is_directory(name, error)) refuse(name, "a folder of this name is in the way");
 }
 
 void Outputs::checkNumbered(const std::string& extension) const {
@@ -64,66 +120,82 @@ void Outputs::checkNumbered(const std::string& extension) const {
     }
 }
 
-bool Outputs::isDevice() const {
-    std::error_code error;
-    const auto status = fs::status(output_, error);
-    return fs::exists(status) && !fs::is_regular_file(status);
-}
-
 std::string Outputs::withFinalNames(std::string text) const {
-    const std::string hidden = folder_.string() + "/";
-    const std::string shown = output_.has_parent_path() ? output_.parent_path().string() + "/" : "";
+    const std::string hidden = (folder_ / kBase).string();
+    const std::string shown = (output_.parent_path() / output_.stem()).string();
     for (size_t at = 0; !folder_.empty() && (at = text.find(hidden, at)) != std::string::npos;
          at += shown.size())
         text.replace(at, hidden.size(), shown);
     return text;
 }
 
+std::string Outputs::hiddenName(const std::string& extension) const {
+    return (folderOf(output_) / (kBase + "." + extension)).string();
+}
+
 std::string Outputs::begin(const std::string& extension) {
     // What is written to a device or a pipe goes straight there, by a link in a folder elsewhere.
-    const fs::path where = isDevice() ? fs::temp_directory_path() : folderOf(output_);
+    const fs::path where = device_ ? fs::temp_directory_path() : folderOf(output_);
     std::string pattern = (where / ".tarsel-XXXXXX").string();
-    if (!mkdtemp(pattern.data())) refuse(output_, std::strerror(errno));
+    if (!mkdtemp(pattern.data())) refuse(output_, inLine(std::strerror(errno)));
     folder_ = pattern;
-    fs::path name = folder_ / output_.stem();
+    fs::path name = folder_ / kBase;
     name += "." + extension;
-    if (isDevice()) {
+    if (device_) {
         std::error_code error;
         fs::create_symlink(fs::absolute(output_), name, error);
-        if (error) refuse(output_, error.message());
+        if (error) refuse(output_, inLine(error.message()));
     }
     return name.string();
 }
 
 std::string Outputs::finalName(const fs::path& written, const std::string& from) const {
-    fs::path name = written.filename();
-    if (name.extension() == "." + from) name.replace_extension(output_.extension());
+    const std::string rest = written.filename().string().substr(kBase.size());
+    fs::path name = output_.stem();
+    name += rest == "." + from ? output_.extension().string() : rest;
     return (output_.has_parent_path() ? output_.parent_path() / name : name).string();
 }
 
-std::vector<std::string> Outputs::commit(const std::string& from) {
-    std::vector<fs::path> written;
+std::vector<fs::path> Outputs::written() const {
+    std::vector<fs::path> files;
     std::error_code error;
-    for (const auto& entry : fs::directory_iterator(folder_, error))
-        if (!fs::is_symlink(entry.symlink_status())) written.push_back(entry.path());
-    if (error) refuse(output_, error.message());
-    std::sort(written.begin(), written.end());
-    for (const auto& file : written) checkFinal(finalName(file, from));
+    if (device_ || folder_.empty()) return files;
+    for (const auto& entry : fs::directory_iterator(folder_, error)) files.push_back(entry.path());
+    if (error) refuse(output_, inLine(error.message()));
+    std::sort(files.begin(), files.end());
+    return files;
+}
+
+std::vector<std::string> Outputs::commit(const std::string& from) {
+    if (device_) {
+        discard();
+        return {output_.string()};
+    }
     std::vector<std::string> names;
-    for (const auto& file : written) {
-        const std::string name = finalName(file, from);
-        fs::rename(file, name, error);
-        if (error) {
-            for (const auto& done : names) fs::remove(done, error);
-            refuse(name, error.message());
+    {
+        std::lock_guard guard(lock_);
+        const std::vector<fs::path> files = written();
+        std::vector<Placed> placed;
+        try {
+            for (const auto& file : files) {
+                const fs::path name = finalName(file, from);
+                checkFinal(name);
+                placed.push_back({file, name, place(file, name, overwrite_)});
+                names.push_back(name.string());
+            }
+        } catch (...) {
+            for (auto p = placed.rbegin(); p != placed.rend(); ++p) takeBack(*p);
+            throw;
         }
-        names.push_back(name);
     }
     discard();
+    const auto first = std::find(names.begin(), names.end(), output_.string());
+    if (first != names.end()) std::rotate(names.begin(), first, first + 1);
     return names;
 }
 
 void Outputs::discard() {
+    std::lock_guard guard(lock_);
     if (folder_.empty()) return;
     std::error_code ignored;
     fs::remove_all(folder_, ignored);

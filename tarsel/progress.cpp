@@ -4,6 +4,7 @@
 #include <cstdio>
 #include <cstdlib>
 
+#include <sys/ioctl.h>
 #include <unistd.h>
 #include <nlohmann/json.hpp>
 
@@ -17,6 +18,24 @@ constexpr auto kJsonInterval = std::chrono::milliseconds(500);
 nlohmann::ordered_json orNull(double value) {
     return std::isfinite(value) && value >= 0 ? nlohmann::ordered_json(value)
                                               : nlohmann::ordered_json(nullptr);
+}
+
+// Cut to the terminal's width: a line that wraps can't be overwritten.
+std::string fitted(const std::string& text) {
+    winsize size{};
+    if (ioctl(STDERR_FILENO, TIOCGWINSZ, &size) != 0 || size.ws_col == 0) return text;
+    std::string cut;
+    int columns = 0;
+    for (size_t i = 0; i < text.size(); ++i) {
+        if (text[i] == '\x1b') {  // takes no place
+            const size_t end = text.find('m', i);
+            cut += text.substr(i, end - i + 1);
+            i = end;
+        } else if (columns++ < size.ws_col - 1) {
+            cut += text[i];
+        }
+    }
+    return cut;
 }
 
 double round1(double value) { return std::round(value * 10) / 10; }
@@ -79,7 +98,7 @@ void Progress::showLine(const ProgressState& state, double elapsed, double eta) 
     if (eta >= 0)
         text += "  left " + formatTime(std::ceil(eta)).substr(0, formatTime(std::ceil(eta)).size() - 4);
     if (std::string_view(state.state) == "paused") text += "  paused (p resumes)";
-    std::fprintf(stderr, "\r%s\x1b[K", text.c_str());
+    std::fprintf(stderr, "\r%s\x1b[K", fitted(text).c_str());
     std::fflush(stderr);
 }
 

@@ -24,6 +24,10 @@ class Progress {
     // Cheap: shows something only when the last time is long enough ago.
     void update(const ProgressState& state);
     bool due() const;
+    // Shows it at once.
+    void show(const ProgressState& state) {
+        if (json_ || line_) show("progress", state);
+    }
     // Sends the last event; the line goes.
     void finish(const ProgressState& state);
     bool onTerminal() const { return line_; }

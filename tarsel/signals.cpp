@@ -16,17 +16,23 @@ std::function<void()> g_first, g_second;
 sigset_t stopSignals() {
     sigset_t set;
     sigemptyset(&set);
-    sigaddset(&set, SIGINT);
-    sigaddset(&set, SIGTERM);
+    for (int number : {SIGINT, SIGTERM, SIGHUP}) {
+        struct sigaction action {};
+        // What the caller ignores, as nohup does, stays ignored.
+        if (sigaction(number, nullptr, &action) == 0 && action.sa_handler != SIG_IGN) sigaddset(&set, number);
+    }
     return set;
 }
 
-Exit statusOf(int signal) { return signal == SIGTERM ? Exit::terminated : Exit::interrupted; }
+Exit statusOf(int signal) {
+    return signal == SIGTERM ? Exit::terminated : signal == SIGHUP ? Exit::hangup : Exit::interrupted;
+}
 
 // Runs for the life of the process, so it is detached: a signal may come until the very end.
 void waitForSignals() {
     const sigset_t set = stopSignals();
-    for (int signal = 0; sigwait(&set, &signal) == 0;) {
+    for (int signal = 0;;) {
+        if (sigwait(&set, &signal) != 0) continue;
         const int earlier = g_received.exchange(signal);
         std::lock_guard guard(g_lock);
         if (earlier != 0 || !g_first) {
@@ -46,15 +52,13 @@ Signals::Signals() {
     std::thread(waitForSignals).detach();
 }
 
-Signals::~Signals() { unwatch(); }
+Signals::~Signals() { watch(nullptr, nullptr); }
 
 void Signals::watch(std::function<void()> first, std::function<void()> second) {
     std::lock_guard guard(g_lock);
     g_first = std::move(first);
     g_second = std::move(second);
 }
-
-void Signals::unwatch() { watch(nullptr, nullptr); }
 
 Exit Signals::received() const {
     const int signal = g_received.load();

@@ -14,13 +14,6 @@ namespace {
 constexpr int kDecoder = 2;
 constexpr const char* kGenerator = "testgen:";
 
-std::vector<std::string> moduleNames(int kind) {
-    std::vector<std::string> names;
-    const AnyVector modules = qv_registry()->modules(kind);
-    for (int i = 0; i < modules.size(); ++i) names.push_back(modules.at(i).asDict().getString("name", ""));
-    return names;
-}
-
 // Every name that a raw format takes.
 const std::vector<std::string> kRawKeys = {"size",       "pixel",  "rate",   "offset",
                                            "interlaced", "invert", "aspect", "fields"};
@@ -35,6 +28,13 @@ double parseAspect(const std::string& text, const std::string& option) {
 }
 
 }  // namespace
+
+std::vector<std::string> moduleNames(int kind) {
+    std::vector<std::string> names;
+    const AnyVector modules = qv_registry()->modules(kind);
+    for (int i = 0; i < modules.size(); ++i) names.push_back(modules.at(i).asDict().getString("name", ""));
+    return names;
+}
 
 std::unique_ptr<QvCodec> makeAnyCodec(const std::string& module, int kind) {
     const QvModule* found = qv_registry()->module(module.c_str());
@@ -56,7 +56,9 @@ void setChecked(QvCodec& codec, const std::string& name, const Any& value, const
         throw Failure(Exit::usage, what + ": " + codec.name() + " has no parameter " + inQuotes(name));
     }
     if (result == QvStatus::ok) return;
-    throw Failure(Exit::usage, what + ": " + codec.name() + " can't take this value for " + inQuotes(name));
+    const std::string reason = codec.errorDesc();
+    throw Failure(Exit::usage, what + ": " + codec.name() + " can't take this value for " + inQuotes(name) +
+                                   (reason.empty() ? "" : " (" + inLine(reason) + ")"));
 }
 
 Source::Source(const std::string& spec, const std::string& raw) : name_(spec) {
@@ -69,7 +71,9 @@ Source::Source(const std::string& spec, const std::string& raw) : name_(spec) {
     }
     std::error_code error;
     const auto status = std::filesystem::status(spec, error);
-    if (!std::filesystem::exists(status)) refuse("no such file");
+    if (!std::filesystem::exists(status))
+        refuse(error && error != std::errc::no_such_file_or_directory ? inLine(error.message())
+                                                                      : "no such file");
     if (std::filesystem::is_directory(status)) refuse("this is a folder");
     if (std::filesystem::is_regular_file(status)) {
         if (std::filesystem::file_size(spec, error) == 0 && !error) refuse("the file is empty");
@@ -87,7 +91,7 @@ Source::Source(const std::string& spec, const std::string& raw) : name_(spec) {
 }
 
 void Source::refuse(const std::string& why) const {
-    throw Failure(Exit::input, "can't open " + inQuotes(name_) + ": " + why);
+    throw Failure(Exit::input, "can't open " + inQuotes(name_) + ": " + inLine(why));
 }
 
 void Source::openGenerator(const std::string& spec) {
@@ -104,6 +108,8 @@ void Source::openGenerator(const std::string& spec) {
         throw Failure(Exit::usage, option + ": size: the test picture is at least 32x32");
     const QvFramerate rate = parseRate(value("rate", "25"), option + ": rate");
     const MediaTime duration = parseTime(value("duration", "10"), rate, option + ": duration");
+    if (duration.position(rate) < 1)
+        throw Failure(Exit::usage, option + ": duration: " + value("duration", "10") + " holds no frame");
 
     AnyDict video, audio, streams;
     video.set("width", size.width);
@@ -146,7 +152,7 @@ void Source::openRaw(const std::string& raw) {
     QvDecodePipe& d = *decoder_;
     const Size dimensions = parseSize(*size, option + " size");
     setChecked(d, "filename", name_.c_str(), option);
-    setChecked(d, "FOURCC", static_cast<int>(parseFourcc(*pixel, option + " pixel")), option + " pixel");
+    setChecked(d, "FOURCC", static_cast<int>(parsePixel(*pixel, option + " pixel")), option + " pixel");
     setChecked(d, "width", dimensions.width, option + " size");
     setChecked(d, "height", dimensions.height, option + " size");
     setChecked(d, "framerate", Any(parseRate(rate ? *rate : "25", option + " rate")), option + " rate");
@@ -206,6 +212,12 @@ void Source::openFile() {
                "; 'tarsel formats' lists what opens");
     }
     refuse(reasonOf(candidates));
+}
+
+long long Source::bytes() const {
+    std::error_code error;
+    const auto size = isFile_ ? std::filesystem::file_size(name_, error) : 0;
+    return isFile_ && !error ? static_cast<long long>(size) : -1;
 }
 
 std::optional<QvFramerate> Source::frameRate() const {

@@ -16,6 +16,8 @@ class Source {
 
     QvDecodePipe& decoder() const { return *decoder_; }
     const std::string& name() const { return name_; }
+    // Bytes of the file; negative when it is none.
+    long long bytes() const;
     bool isFile() const { return isFile_; }
 
     // Of the first video stream.
@@ -43,6 +45,9 @@ class Source {
 // Sets a parameter that the decoder, encoder or filter must know; throws Failure (usage) for an unknown name
 // or a value it can't take.
 void setChecked(QvCodec& codec, const std::string& name, const Any& value, const std::string& what);
+
+// The names of all modules of a kind.
+std::vector<std::string> moduleNames(int kind);
 
 // A new codec of a module, which must exist and be of a kind. Throws Failure (module).
 template <class T>

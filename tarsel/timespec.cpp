@@ -139,12 +139,14 @@ long long parseNumber(std::string_view text, long long low, long long high, std:
     return *value;
 }
 
-unsigned parseFourcc(std::string_view text, std::string_view option) {
-    if (text.empty() || text.size() > 4) refuse(option, text, "a pixel format; 'tarsel formats' lists them");
-    unsigned code = 0;
-    for (size_t i = 0; i < 4; ++i)
-        code |= static_cast<unsigned>(static_cast<unsigned char>(i < text.size() ? text[i] : ' ')) << (8 * i);
-    return code;
+unsigned parsePixel(std::string_view text, std::string_view option) {
+    std::vector<std::string> known;
+    for (const QvPixelFormat& format : qvPixelFormats()) {
+        known.push_back(fourccText(format.fourcc));
+        if (text == known.back()) return format.fourcc;
+    }
+    throw Failure(Exit::usage, std::string(option) + ": there is no pixel format " + inQuotes(text) + "." +
+                                   suggestion(text, known) + " 'tarsel formats' lists all");
 }
 
 std::string fourccText(unsigned fourcc) {

@@ -24,8 +24,8 @@ Size parseSize(std::string_view text, std::string_view option);
 // A whole number within bounds.
 long long parseNumber(std::string_view text, long long low, long long high, std::string_view option);
 
-// Four characters, as "I420"; shorter ones are padded with blanks.
-unsigned parseFourcc(std::string_view text, std::string_view option);
+// The FOURCC of a pixel format that the engine knows, as "I420".
+unsigned parsePixel(std::string_view text, std::string_view option);
 std::string fourccText(unsigned fourcc);
 
 std::string formatTime(double seconds);  // H:MM:SS.mmm

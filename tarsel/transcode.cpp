@@ -14,12 +14,14 @@ void resolve(Given& given) {
     JobOptions& job = given.job;
     if (!given.size.empty()) job.size = parseSize(given.size, "--size");
     if (!given.rate.empty()) job.rate = parseRate(given.rate, "--rate");
-    if (!given.pixel.empty()) job.pixel = parseFourcc(given.pixel, "--pixel");
+    if (!given.pixel.empty()) job.pixel = parsePixel(given.pixel, "--pixel");
     if (!given.samplerate.empty())
         job.samplerate = static_cast<int>(parseNumber(given.samplerate, 1000, 768000, "--samplerate"));
     if (!given.channels.empty())
         job.channels = static_cast<int>(parseNumber(given.channels, 1, 8, "--channels"));
     if (!given.bits.empty()) job.bits = static_cast<int>(parseNumber(given.bits, 8, 24, "--bits"));
+    if (job.bits && *job.bits % 8 != 0)
+        throw Failure(Exit::usage, "--bits: " + inQuotes(given.bits) + " is not 8, 16 or 24");
     if (!job.muxer.empty() && job.muxer != "nullmux" && job.muxer != "rawmux" && job.muxer != "rawavimux")
         throw Failure(Exit::module, "--muxer: there is no multiplexer " + inQuotes(job.muxer) +
                                         " for this tool." +
@@ -59,6 +61,11 @@ void addTranscode(CLI::App& app, Action& chosen, Signals& signals) {
     command->add_option("--bits", given->bits, "Bits of a sample: 8, 16 or 24")->type_name("N");
     command->add_option("--filter", job.filters, "A filter: NAME or NAME:key=value,...")->type_name("FILTER");
     command->add_option("--muxer", job.muxer, "nullmux: do everything but write")->type_name("NAME");
+    command
+        ->add_option(
+            "--post", job.post,
+            "A command run afterwards; %i and %o stand for the inputs and outputs, %o1 for the first")
+        ->type_name("CMD");
     command->add_option("--save-task", job.saveTask, "Write the job as a task file")->type_name("FILE");
     command->add_option("--progress", given->progress, "auto, json (lines on stderr) or none")
         ->check(CLI::IsMember({"auto", "json", "none"}));

@@ -1,0 +1,112 @@
+// Pictures, and the sound that belongs to them, from source to file.
+#include <nlohmann/json.hpp>
+
+#include "tests/system/tool.h"
+
+namespace {
+
+using nlohmann::json;
+
+class Picture : public Tool {};
+
+// Four seconds at 29.97 hold 119 whole frames, and these last 175104 samples at 44100 Hz.
+TEST_F(Picture, GeneratedFramesAndTheirSamples) {
+    const Outcome o =
+        tarsel({"transcode", "testgen:size=96x64,rate=30000/1001,duration=4", "-o", "card.raw"});
+    ASSERT_EQ(o.status, 0) << o.err;
+    EXPECT_EQ(o.out, "");
+    EXPECT_EQ(o.err, "tarsel: wrote 'card.raw' and 'card.wav', 119 frames, 175104 samples\n");
+    EXPECT_EQ(listing(), (std::set<std::string>{"card.raw", "card.wav"}));
+    EXPECT_EQ(size("card.raw"), 119 * 96 * 64 * 4);
+    EXPECT_EQ(wavPart(contents("card.wav"), "data").size(), 175104u * 2 * 2);
+    const json info = json::parse(tarsel({"info", "card.wav", "--json"}).out)[0];
+    EXPECT_EQ(info["streams"][0]["samples"], 175104);
+    EXPECT_EQ(info["streams"][0]["samplerate"], 44100);
+    // Rows differ and frames differ: there is a picture, and it moves.
+    const std::string card = contents("card.raw");
+    EXPECT_NE(card.substr(0, 96 * 4), card.substr(32 * 96 * 4, 96 * 4));
+    EXPECT_NE(card.substr(0, 96 * 64 * 4), card.substr(60 * 96 * 64 * 4, 96 * 64 * 4));
+    // The sound is no silence, and the same job gives the same bytes.
+    EXPECT_NE(wavPart(contents("card.wav"), "data").find_first_not_of('\0'), std::string::npos);
+    works({"transcode", "testgen:size=96x64,rate=30000/1001,duration=4", "-o", "again.raw"});
+    EXPECT_TRUE(card == contents("again.raw"));
+    EXPECT_TRUE(contents("card.wav") == contents("again.wav"));
+}
+
+TEST_F(Picture, FramesBetweenPointsAreThoseOfTheInput) {
+    makeYuv("clip.yuv", 100);
+    const std::string clip = contents("clip.yuv");
+    const struct {
+        std::vector<std::string> points;
+        size_t first, count;
+    } cases[] = {
+        {{"--from", "1", "--to", "3"}, 25, 50},
+        {{"--from", "25f", "--to", "26f"}, 25, 1},
+        {{"--to", "00:00:00:10"}, 0, 10},
+        {{"--from", "0:03.96"}, 99, 1},
+        {{"--from", "00:00:02.000", "--to", "00:00:03.000"}, 50, 25},
+        {{}, 0, 100},
+    };
+    for (const auto& c : cases) {
+        SCOPED_TRACE(testing::PrintToString(c.points));
+        std::vector<std::string> job = asYuv({"transcode", "clip.yuv", "-o", "part.yuv", "-y"});
+        job.insert(job.end(), c.points.begin(), c.points.end());
+        const Outcome o = tarsel(job);
+        ASSERT_EQ(o.status, 0) << o.err;
+        EXPECT_TRUE(clip.substr(c.first * kFrame, c.count * kFrame) == contents("part.yuv"));
+        EXPECT_THAT(o.err, testing::HasSubstr(", " + std::to_string(c.count) + " frame"));
+    }
+}
+
+TEST_F(Picture, PointsThatHoldNothing) {
+    makeYuv("clip.yuv", 25);
+    const struct {
+        std::vector<std::string> points;
+        std::vector<std::string> parts;
+    } cases[] = {
+        {{"--from", "3"}, {"--from 3", "behind the end", "0:00:01.000"}},
+        {{"--from", "0.5", "--to", "0.2"}, {"--to 0.2", "--from 0.5"}},
+        {{"--from", "0.5", "--to", "0.5"}, {"--to 0.5", "--from 0.5"}},
+        {{"--to", "0"}, {"--to 0"}},
+        {{"--from", "0.999"}, {"no frame"}},
+        {{"--from", "0.5", "--to", "0.501"}, {"no frame"}},
+        {{"--to", "0:99"}, {"'0:99'", "is not a time"}},
+        {{"--from", "-1"}, {"--from", "'-1'"}},
+        {{"--from", "1e3"}, {"'1e3'"}},
+        {{"--from", "nan"}, {"'nan'"}},
+        {{"--from", "99999999999999999999"}, {"is not a time"}},
+    };
+    for (const auto& c : cases) {
+        std::vector<std::string> job = asYuv({"transcode", "clip.yuv", "-o", "part.yuv"});
+        job.insert(job.end(), c.points.begin(), c.points.end());
+        fails(2, job, c.parts);
+    }
+}
+
+TEST_F(Picture, AFileThatEndsWithinAFrame) {
+    makeYuv("clip.yuv", 2.5);
+    const auto job = asYuv({"transcode", "clip.yuv", "-o", "out.yuv"});
+    fails(3, job, {"'clip.yuv' is damaged", "frame 3", "2 whole", "--accept-partial"});
+    auto partial = job;
+    partial.push_back("--accept-partial");
+    works(partial);
+    EXPECT_TRUE(contents("clip.yuv").substr(0, 2 * kFrame) == contents("out.yuv"));
+    folder.write("short.yuv", patternBytes(100));
+    fails(3, asYuv({"transcode", "short.yuv", "-o", "o.yuv"}),
+          {"'short.yuv'", "shorter than one frame", "64x48"});
+}
+
+TEST_F(Picture, SizesThatAreNone) {
+    makeYuv("clip.yuv", 1);
+    for (const char* size : {"0x48", "-1x48", "100000x48", "64x0", "64x-1", "64x100000", "64", "x", "64x48x2",
+                             "6e1x48", "65535x65535", ""}) {
+        fails(2,
+              {"transcode", "clip.yuv", "--raw", std::string("size=") + size + ",pixel=I420", "-o", "o.yuv"},
+              {"--raw", "size"});
+        if (std::string(size) != "65535x65535")
+            fails(2, asYuv({"transcode", "clip.yuv", std::string("--size=") + size, "-o", "o.yuv"}),
+                  {"--size"});
+    }
+}
+
+}  // namespace

@@ -1,0 +1,85 @@
+// Stopping in the middle: the status says which signal, and nothing is left that looks whole.
+#include <sys/stat.h>
+
+#include "tests/system/tool.h"
+
+namespace {
+
+class Signal : public Tool {
+  protected:
+    // Long enough that only a signal ends it.
+    static constexpr const char* kEndless = "testgen:size=64x64,rate=25,duration=20000,audio=0";
+    static std::vector<std::string> endless() {
+        return words({"transcode", kEndless, "-o", "out.raw", "--progress", "json"});
+    }
+};
+
+TEST_F(Signal, StopsAndCleansUp) {
+    const struct { int signal, status; } cases[] = {{SIGINT, 130}, {SIGTERM, 143}, {SIGHUP, 129}};
+    for (const auto& c : cases) {
+        Process run(endless(), here());
+        ASSERT_TRUE(run.waitFor("\"event\":\"progress\""));
+        run.signal(c.signal);
+        const Outcome o = run.finish();
+        EXPECT_EQ(o.status, c.status) << o.err;
+        EXPECT_THAT(o.err, testing::HasSubstr("\"event\":\"end\""));
+        EXPECT_THAT(o.err, testing::HasSubstr("\"state\":\"stopped\""));
+        EXPECT_THAT(o.err, testing::HasSubstr("tarsel: stopped; nothing was left behind\n"));
+        EXPECT_EQ(listing(), std::set<std::string>());
+    }
+}
+
+TEST_F(Signal, AnExistingOutputStaysAsItWas) {
+    folder.write("out.raw", "precious");
+    auto job = endless();
+    job.push_back("-y");
+    Process run(job, here());
+    ASSERT_TRUE(run.waitFor("\"event\":\"progress\""));
+    run.signal(SIGINT);
+    EXPECT_EQ(run.finish().status, 130);
+    EXPECT_EQ(contents("out.raw"), "precious");
+    EXPECT_EQ(listing(), std::set<std::string>{"out.raw"});
+}
+
+// A reader that takes nothing holds the job up, so the first signal can't end it.
+TEST_F(Signal, TheSecondEndsAtOnce) {
+    mkfifo(folder.file("pipe.raw").c_str(), 0600);
+    const int reader = open(folder.file("pipe.raw").c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
+    Process run(words({"transcode", kEndless, "-o", "pipe.raw", "--progress", "json"}), here());
+    ASSERT_TRUE(run.waitFor("\"event\":\"start\""));
+    char byte;
+    pollfd data{reader, POLLIN, 0};
+    ASSERT_EQ(poll(&data, 1, Process::kPatience), 1);
+    ASSERT_EQ(read(reader, &byte, 1), 1);
+    run.signal(SIGINT);
+    ASSERT_TRUE(run.waitFor("tarsel: stopping"));
+    run.signal(SIGINT);
+    EXPECT_EQ(run.finish().status, 130);
+    EXPECT_EQ(listing(), std::set<std::string>{"pipe.raw"});
+    close(reader);
+}
+
+TEST_F(Signal, AReaderThatGoesIsAnError) {
+    mkfifo(folder.file("pipe.raw").c_str(), 0600);
+    const int reader = open(folder.file("pipe.raw").c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
+    Process run(words({"transcode", kEndless, "-o", "pipe.raw", "--progress", "json"}), here());
+    pollfd data{reader, POLLIN, 0};
+    ASSERT_EQ(poll(&data, 1, Process::kPatience), 1);
+    close(reader);
+    const Outcome o = run.finish();
+    EXPECT_EQ(o.status, 4);
+    EXPECT_THAT(o.err, testing::AllOf(testing::HasSubstr("'pipe.raw'"), testing::HasSubstr("Broken pipe")));
+}
+
+TEST_F(Signal, WhatIsIgnoredStaysIgnored) {
+    ProcessOptions nohup = here();
+    nohup.ignoreHangup = true;
+    Process run(endless(), nohup);
+    ASSERT_TRUE(run.waitFor("\"event\":\"progress\""));
+    run.signal(SIGHUP);
+    ASSERT_TRUE(run.waitFor("\"event\":\"progress\""));
+    run.signal(SIGTERM);
+    EXPECT_EQ(run.finish().status, 143);
+}
+
+}  // namespace

@@ -1,0 +1,98 @@
+// Sound from file to file: every sample arrives.
+#include <nlohmann/json.hpp>
+
+#include "tests/system/tool.h"
+
+namespace {
+
+using nlohmann::json;
+
+class Sound : public Tool {};
+
+TEST_F(Sound, EverySampleArrives) {
+    const struct {
+        unsigned bits, channels, rate, samples;
+    } cases[] = {
+        {8, 1, 8000, 1},      {8, 2, 44100, 30001},  {16, 1, 44100, 44101}, {16, 2, 48000, 100003},
+        {16, 6, 96000, 9999}, {16, 8, 11025, 501},   {24, 1, 192000, 7777}, {24, 2, 44100, 65537},
+        {24, 8, 48000, 3001}, {24, 3, 22050, 12345}, {16, 5, 5512, 2},      {8, 7, 768000, 99},
+    };
+    for (const auto& c : cases) {
+        SCOPED_TRACE(std::to_string(c.bits) + " bits, " + std::to_string(c.channels) + " channels");
+        makeWav("take.wav", c.samples, c.channels, c.bits, c.rate);
+        const Outcome o = tarsel({"transcode", "take.wav", "-o", "out.wav", "-y"});
+        ASSERT_EQ(o.status, 0) << o.err;
+        const std::string in = contents("take.wav"), out = contents("out.wav");
+        EXPECT_TRUE(wavPart(in, "data") == wavPart(out, "data"));
+        EXPECT_EQ(wavPart(in, "fmt ").substr(2, 14).substr(0, 6), wavPart(out, "fmt ").substr(2, 6));
+        EXPECT_EQ(out.size() % 2, 0u);
+        const json info = json::parse(tarsel({"info", "out.wav", "--json"}).out)[0]["streams"][0];
+        EXPECT_EQ(info["samplerate"], c.rate);
+        EXPECT_EQ(info["channels"], c.channels);
+        EXPECT_EQ(info["bits"], c.bits);
+        EXPECT_EQ(info["samples"], c.samples);
+    }
+}
+
+TEST_F(Sound, SplitChannelsGiveAFileEach) {
+    makeWav("take.wav", 1001, 3, 24, 48000);
+    works({"transcode", "take.wav", "--split-channels", "-o", "part.wav"});
+    EXPECT_EQ(listing(), (std::set<std::string>{"take.wav", "part#00.wav", "part#01.wav", "part#02.wav"}));
+    const std::string in = wavPart(contents("take.wav"), "data");
+    for (size_t channel = 0; channel < 3; ++channel) {
+        std::string wanted;
+        for (size_t i = channel * 3; i < in.size(); i += 9) wanted += in.substr(i, 3);
+        EXPECT_TRUE(wanted == wavPart(contents("part#0" + std::to_string(channel) + ".wav"), "data"));
+    }
+    fails(4, {"transcode", "take.wav", "--split-channels", "-o", "part.wav"}, {"part#0", "it exists", "-y"});
+}
+
+TEST_F(Sound, PointsAreSamples) {
+    makeWav("take.wav", 48000, 2, 16, 48000);
+    const std::string in = wavPart(contents("take.wav"), "data");
+    const struct {
+        const char *from, *to;
+        size_t first, end;
+    } cases[] = {{"0.25", "0.75", 12000, 36000}, {"0", "0.001", 0, 48}, {"0.5", "00:00:01", 24000, 48000}};
+    for (const auto& c : cases) {
+        works({"transcode", "take.wav", "--from", c.from, "--to", c.to, "-o", "part.wav", "-y"});
+        EXPECT_TRUE(in.substr(c.first * 4, (c.end - c.first) * 4) == wavPart(contents("part.wav"), "data"))
+            << c.from;
+    }
+}
+
+TEST_F(Sound, AFileWithoutSamplesStaysOne) {
+    makeWav("silent.wav", 0);
+    works({"transcode", "silent.wav", "-o", "out.wav"});
+    EXPECT_EQ(wavPart(contents("out.wav"), "fmt ").substr(2, 6),
+              wavPart(contents("silent.wav"), "fmt ").substr(2, 6));
+    EXPECT_EQ(wavPart(contents("out.wav"), "data"), "");
+}
+
+// An unknown length, as a recorder leaves it, is taken for what it is; any other one that lies is not.
+TEST_F(Sound, LengthsThatLie) {
+    const std::string data = patternBytes(4000);
+    const auto file = [&](unsigned length) {
+        return "RIFF" + leBytes(36u + length, 4) + "WAVE" + wavChunk("fmt ", wavFormat(1, 2, 44100, 16)) +
+               "data" + leBytes(length, 4) + data;
+    };
+    folder.write("open.wav", file(0xFFFFFFFF));
+    works({"transcode", "open.wav", "-o", "open_out.wav"});
+    EXPECT_TRUE(data == wavPart(contents("open_out.wav"), "data"));
+    folder.write("cut.wav", file(8000));
+    folder.write("long.wav", file(0xFFFFFFF0));
+    fails(3, {"transcode", "cut.wav", "-o", "out.wav"},
+          {"'cut.wav'", "1000 of 2000 samples", "--accept-partial"});
+    fails(3, {"transcode", "long.wav", "-o", "out.wav"}, {"'long.wav'", "1000 of ", "--accept-partial"});
+    const Outcome o = tarsel({"transcode", "cut.wav", "-o", "out.wav", "--accept-partial"});
+    EXPECT_EQ(o.status, 0);
+    EXPECT_THAT(o.err, testing::HasSubstr("warning: 'cut.wav' is damaged"));
+    EXPECT_THAT(o.err, testing::HasSubstr("(1 warning)"));
+    EXPECT_TRUE(data == wavPart(contents("out.wav"), "data"));
+    const Outcome info = tarsel({"info", "cut.wav", "--json"});
+    EXPECT_EQ(info.status, 3);
+    EXPECT_EQ(json::parse(info.out)[0]["bytes"], size("cut.wav"));
+    EXPECT_THAT(std::string(json::parse(info.out)[0]["damage"]), testing::HasSubstr("1000 of 2000"));
+}
+
+}  // namespace

@@ -1,0 +1,60 @@
+// What is seen on a terminal, and the keys that work there.
+#include "tests/system/tool.h"
+
+namespace {
+
+using testing::HasSubstr;
+
+class Terminal : public Tool {
+  protected:
+    ProcessOptions screen() const {
+        ProcessOptions options = here();
+        options.terminal = true;
+        return options;
+    }
+    static constexpr const char* kEndless = "testgen:size=64x64,rate=25,duration=20000,audio=0";
+};
+
+TEST_F(Terminal, PausesResumesAndStops) {
+    Process run(words({"transcode", kEndless, "-o", "out.raw"}), screen());
+    ASSERT_TRUE(run.waitFor("frame"));
+    run.type("p");
+    ASSERT_TRUE(run.waitFor("paused"));
+    run.type("p");
+    ASSERT_TRUE(run.waitFor("frame"));
+    run.type("\x03");
+    const Outcome o = run.finish();
+    EXPECT_EQ(o.status, 130);
+    EXPECT_THAT(o.out, HasSubstr("stopped; nothing was left behind"));
+    EXPECT_EQ(listing(), std::set<std::string>());
+}
+
+TEST_F(Terminal, StopsWhilePaused) {
+    Process run(words({"transcode", kEndless, "-o", "out.raw"}), screen());
+    ASSERT_TRUE(run.waitFor("frame"));
+    run.type("p");
+    ASSERT_TRUE(run.waitFor("paused"));
+    run.signal(SIGTERM);
+    EXPECT_EQ(run.finish().status, 143);
+    EXPECT_EQ(listing(), std::set<std::string>());
+}
+
+TEST_F(Terminal, OneLineThatGoes) {
+    const std::vector<std::string> job = {"transcode", "testgen:size=64x64,rate=25,duration=2", "-o",
+                                          "out.raw", "-y"};
+    ProcessOptions plain = screen();
+    plain.environment = {"NO_COLOR=1"};
+    for (const auto& options : {screen(), plain}) {
+        const Outcome o = tarsel(job, options);
+        EXPECT_EQ(o.status, 0);
+        EXPECT_EQ(std::count(o.out.begin(), o.out.end(), '\n'), 1) << o.out;
+        EXPECT_THAT(o.out, HasSubstr("task 1 of 1"));
+        EXPECT_THAT(o.out, HasSubstr("\r\x1b[Ktarsel: wrote 'out.raw'"));
+        EXPECT_EQ(o.out.find("\x1b[1m") != std::string::npos, options.environment.empty()) << "colour";
+    }
+    const Outcome quiet =
+        tarsel({"transcode", "testgen:size=64x64,rate=25,duration=2", "-o", "q.raw", "-q"}, screen());
+    EXPECT_EQ(quiet.out, "");
+}
+
+}  // namespace
