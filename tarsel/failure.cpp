@@ -40,6 +40,9 @@ std::string suggestion(std::string_view unknown, const std::vector<std::string>&
 
 std::string inLine(std::string text) {
     std::replace(text.begin(), text.end(), '\n', ' ');
+    // A log line's "[part of the engine] ".
+    if (const size_t end = text.find("] "); text[0] == '[' && end != std::string::npos)
+        text.erase(0, end + 2);
     while (!text.empty() && (text.back() == ' ' || text.back() == '.')) text.pop_back();
     const auto isSmall = [](char c) { return c == ' ' || (c >= 'a' && c <= 'z'); };
     if (text.size() > 1 && text[0] >= 'A' && text[0] <= 'Z' && isSmall(text[1]))

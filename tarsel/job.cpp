@@ -179,10 +179,23 @@ void Job::planStream(Source& source, int type, int number) {
     streams_.push_back(std::move(stream));
 }
 
+// The end of a stream: an instant whose position is the count of its frames or samples. Not every rate
+// divides the timescale, so the exact one may lie between two ticks.
+MediaTime Job::endOf(const JobStream& stream) {
+    QvDecodePipe& decoder = stream.source->decoder();
+    const MediaTime end = decoder.duration(stream.type, stream.decStream);
+    const Any rate = decoder.getStreamParam(stream.type, stream.decStream,
+                                            stream.type == kVideo ? "framerate" : "samplerate");
+    const bool before = stream.type == kVideo
+                            ? end.position(rate.asFramerate()) < decoder.nrFrames(stream.decStream)
+                            : end.position(rate.toInt32()) < decoder.nrSamples(stream.decStream);
+    return before ? end + MediaTime(1) : end;
+}
+
 void Job::planPoints() {
     for (JobStream& stream : streams_) {
         const auto rate = stream.source->frameRate();
-        const MediaTime length = stream.source->decoder().duration(stream.type, stream.decStream);
+        const MediaTime length = endOf(stream);
         const std::string end =
             "the end of " + inQuotes(stream.source->name()) + " (" + formatTime(length.seconds()) + ")";
         stream.in = MediaTime(0LL, kTicks);
@@ -214,7 +227,7 @@ void Job::planLengths() {
             // A whole number of pairs goes into a halving.
             if (std::abs(2.0 * stream.rate.rate() - static_cast<double>(from)) < 1e-4 && stream.inUnits % 2)
                 stream.expected = (stream.inUnits + 1) / 2;
-            if (stream.expected < 1)
+            if (stream.expected < 1 || stream.inUnits < 1)
                 throw Failure(Exit::usage, "there is no frame of " + inQuotes(stream.source->name()) +
                                                " between " + formatTime(stream.in.seconds()) + " and " +
                                                formatTime(stream.out.seconds()));
@@ -295,8 +308,30 @@ void Job::checkNames() const {
         outputs_->checkFinal(outputs_->finalName(names.asVector().at(i).asString(), "raw"));
 }
 
+// The converters that stand between the formats of input and output.
+void Job::checkConverters(const JobStream& stream) const {
+    const QvDecodePipe& decoder = stream.source->decoder();
+    const auto differs = [&](const char* name, int wanted) {
+        return intParam(decoder, stream.type, stream.decStream, name) != wanted;
+    };
+    if (stream.type == kAudio) {
+        if (differs("samplerate", stream.samplerate)) makeAnyCodec("srconvert", kAudioFilter);
+        if (differs("channels", stream.channels)) makeAnyCodec("chconvert", kAudioFilter);
+        if (differs("bitsPerSample", stream.bits)) makeAnyCodec("aquant", kAudioFilter);
+        return;
+    }
+    if (differs("width", stream.width) || differs("height", stream.height) ||
+        differs("FOURCC", static_cast<int>(stream.fourcc)) || kind_ == OutputKind::pictures)
+        makeAnyCodec("scaler", kVideoFilter);
+    const Any rate = decoder.getStreamParam(stream.type, stream.decStream, "framerate");
+    if (rate.isFramerate() && !(rate.asFramerate() == stream.rate)) makeAnyCodec("frconvert", kVideoFilter);
+}
+
 void Job::planFilters() {
-    for (JobStream& stream : streams_) stream.params.setInOutPoints(InOutPoints(stream.in, stream.out));
+    for (const JobStream& stream : streams_) checkConverters(stream);
+    for (JobStream& stream : streams_)
+        if (!options_.from.empty() || !options_.to.empty())
+            stream.params.setInOutPoints(InOutPoints(stream.in, stream.out));
     FiltersState states[2];
     for (const auto& spec : options_.filters) {
         const size_t colon = spec.find(':');

@@ -66,9 +66,11 @@ class Job {
     void chooseOutput();
     void planStreams();
     void planStream(Source& source, int type, int number);
+    static MediaTime endOf(const JobStream& stream);
     void planPoints();
     void planLengths();
     void planFilters();
+    void checkConverters(const JobStream& stream) const;
     void checkPicture() const;
     void buildPipe();
     void addStream(JobStream& stream);

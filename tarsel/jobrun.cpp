@@ -59,6 +59,15 @@ class Job::Runner : public QvTranscoder {
         if (isPaused()) unpause();
     }
 
+    // Why the run failed: a link knows it better than the run.
+    std::string reason() const {
+        for (const JobStream& stream : job_.streams_)
+            if (const TransLink* link = getLinkForOutput(stream.type, stream.encStream);
+                link && link->errorCode() != 0)
+                return link->errorDesc();
+        return errorDesc();
+    }
+
     void togglePause() { isPaused() ? unpause() : pause(); }
 
     ProgressState state(const char* name) const {
@@ -162,7 +171,8 @@ void Job::stopped(Exit signalled) const {
                                     : "stopped; nothing was left behind");
 }
 
-// The reason stands in the object that failed: a decoder, or one of the output's members.
+// The reason stands in the object that failed: a decoder, a link, or one of the output's members. What the
+// user log has is less exact.
 void Job::fail(Runner& runner) const {
     for (const auto& source : sources_)
         if (source->decoder().errorCode() < 0 && source->decoder().errorCode() != QvStatus::endOfStream)
@@ -172,20 +182,18 @@ void Job::fail(Runner& runner) const {
     const auto take = [&](const QvCodec* codec) {
         if (reason.empty() && codec && codec->errorCode() != 0) reason = codec->errorDesc();
     };
+    for (const JobStream& s : streams_) take(pipe_->encoder(s.type, s.encStream));
+    take(pipe_->getMuxer());
+    take(pipe_->sink());
+    take(pipe_.get());
     AnyVector messages;
     qv_log()->getAll(messages);
     for (int i = 0; i < messages.size() && reason.empty(); ++i)
         if (messages.at(i).asDict().getInt32("type", 0) == 2)
             reason = messages.at(i).asDict().getString("text", "");
-    take(pipe_->getMuxer());
-    take(pipe_->sink());
-    for (const JobStream& s : streams_) take(pipe_->encoder(s.type, s.encStream));
-    take(pipe_.get());
-    if (reason.empty()) throw Failure(Exit::failed, inLine(runner.errorDesc()));
-    if (outputs_) reason = outputs_->withFinalNames(reason);
-    throw Failure(
-        Exit::output,
-        (outputs_ ? "can't write " + inQuotes(outputs_->output().string()) + ": " : "") + inLine(reason));
+    if (reason.empty() || !outputs_) throw Failure(Exit::failed, inLine(runner.reason()));
+    throw Failure(Exit::output, "can't write " + inQuotes(outputs_->output().string()) + ": " +
+                                    inLine(outputs_->withFinalNames(reason)));
 }
 
 void Job::showWarnings() const {

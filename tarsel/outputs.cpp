@@ -22,6 +22,11 @@ fs::path folderOf(const fs::path& name) {
     return name.has_parent_path() ? name.parent_path() : fs::path(".");
 }
 
+// Beside `name`, without a "./" in front.
+fs::path sibling(const fs::path& name, const std::string& filename) {
+    return name.has_parent_path() ? name.parent_path() / filename : fs::path(filename);
+}
+
 [[noreturn]] void refuse(const fs::path& name, const std::string& why) {
     throw Failure(Exit::output, "can't write " + inQuotes(name.string()) + ": " + why);
 }
@@ -116,7 +121,7 @@ void Outputs::checkNumbered(const std::string& extension) const {
         if (name.rfind(stem, 0) != 0 || entry.path().extension() != "." + extension) continue;
         const std::string number = entry.path().stem().string().substr(stem.size());
         if (!number.empty() && number.find_first_not_of("0123456789#") == std::string::npos)
-            checkFinal(entry.path());
+            checkFinal(sibling(output_, name));
     }
 }
 

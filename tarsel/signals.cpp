@@ -48,7 +48,9 @@ void waitForSignals() {
 Signals::Signals() {
     const sigset_t set = stopSignals();
     pthread_sigmask(SIG_BLOCK, &set, nullptr);
-    signal(SIGPIPE, SIG_IGN);  // a closed pipe is an error of the write
+    // A closed pipe and a file that may not grow are errors of the write.
+    signal(SIGPIPE, SIG_IGN);
+    signal(SIGXFSZ, SIG_IGN);
     std::thread(waitForSignals).detach();
 }
 

@@ -20,8 +20,11 @@ constexpr int defaultBits = 16;
 
 int bytesOf(int bits) { return (bits + 7) / 8; }
 
+// An instant within the sample. Not every rate divides the timescale: where a tick before it is meant, the next
+// one is, since its position would otherwise be the sample before.
 MediaTime sampleTime(long long sample, int samplerate) {
-    return MediaTime(sample, samplerate, MediaTime::defaultTimescale);
+    const MediaTime time(sample, samplerate, MediaTime::defaultTimescale);
+    return time.position(samplerate) < sample ? time + MediaTime(1) : time;
 }
 
 MediaTime earlier(const MediaTime& a, const MediaTime& b) { return b < a ? b : a; }
@@ -92,7 +95,8 @@ int TransALink::open(const AnyDict* params) {
     }
     processed_ = -1;
     steps_ = 0;
-    finished_ = silenceLogged_ = worked_ = false;
+    silenceLogged_ = worked_ = false;
+    finished_ = totalOutSamples_ < 1;  // a run of sound alone asks for nothing and would never end
     opened_ = true;
     return QvStatus::ok;
 }
@@ -157,7 +161,7 @@ void TransALink::computeRange() {
     inEnd_ = outPoint().position(inSamplerate_);
     qv_dbg()->debug("ALink.open: In start sample= %lld, in end sample=%lld", inStart_, inEnd_);
     const long long outStart = inPoint().position(outSamplerate_);
-    const long long outEnd = sampleTime(inEnd_, inSamplerate_).position(outSamplerate_);
+    const long long outEnd = MediaTime(inEnd_, inSamplerate_).position(outSamplerate_);
     qv_dbg()->debug("ALink.open: Out start sample=%lld, out end sample=%lld", outStart, outEnd);
     totalInSamples_ = inEnd_ - inStart_;
     totalOutSamples_ = outEnd - outStart;

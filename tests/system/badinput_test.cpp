@@ -52,8 +52,8 @@ TEST_F(BadInput, OneLineAndTheRightStatus) {
     }
     makeWav("good.wav", 10);
     fails(3, {"transcode", "good.wav", "absent.wav", "-o", "out.wav"}, {"'absent.wav'"});
-    fails(3, {"transcode", "good.wav", "-o", "out.yuv"}, {"no picture", "'out.yuv'"});
-    fails(3, {"transcode", "good.wav", "-o", "out.png"}, {"no picture", "'out.png'"});
+    fails(3, {"transcode", "good.wav", "-o", "out.yuv"}, {"no input has a picture", "'out.yuv'"});
+    fails(3, {"transcode", "good.wav", "-o", "out.png"}, {"no input has a picture", "'out.png'"});
     fails(3, asYuv({"transcode", "clip.yuv", "-o", "out.wav"}), {"no input has sound", "'out.wav'"});
     fails(3, {"frame", "good.wav", "-o", "out.png"}, {"'good.wav' has no picture"});
 }

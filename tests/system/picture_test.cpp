@@ -22,10 +22,13 @@ TEST_F(Picture, GeneratedFramesAndTheirSamples) {
     const json info = json::parse(tarsel({"info", "card.wav", "--json"}).out)[0];
     EXPECT_EQ(info["streams"][0]["samples"], 175104);
     EXPECT_EQ(info["streams"][0]["samplerate"], 44100);
-    // Rows differ and frames differ: there is a picture, and it moves.
-    const std::string card = contents("card.raw");
-    EXPECT_NE(card.substr(0, 96 * 4), card.substr(32 * 96 * 4, 96 * 4));
-    EXPECT_NE(card.substr(0, 96 * 64 * 4), card.substr(60 * 96 * 64 * 4, 96 * 64 * 4));
+    // There is a picture, and it moves.
+    const std::string card = contents("card.raw"), first = card.substr(0, 96 * 64 * 4);
+    EXPECT_NE(first.find_first_not_of(first.substr(0, 4)), std::string::npos);
+    bool moves = false;
+    for (size_t frame = 1; frame < 119; ++frame)
+        moves |= card.compare(frame * first.size(), first.size(), first) != 0;
+    EXPECT_TRUE(moves);
     // The sound is no silence, and the same job gives the same bytes.
     EXPECT_NE(wavPart(contents("card.wav"), "data").find_first_not_of('\0'), std::string::npos);
     works({"transcode", "testgen:size=96x64,rate=30000/1001,duration=4", "-o", "again.raw"});
@@ -44,6 +47,7 @@ TEST_F(Picture, FramesBetweenPointsAreThoseOfTheInput) {
         {{"--from", "25f", "--to", "26f"}, 25, 1},
         {{"--to", "00:00:00:10"}, 0, 10},
         {{"--from", "0:03.96"}, 99, 1},
+        {{"--from", "3.999"}, 99, 1},
         {{"--from", "00:00:02.000", "--to", "00:00:03.000"}, 50, 25},
         {{}, 0, 100},
     };
@@ -68,7 +72,6 @@ TEST_F(Picture, PointsThatHoldNothing) {
         {{"--from", "0.5", "--to", "0.2"}, {"--to 0.2", "--from 0.5"}},
         {{"--from", "0.5", "--to", "0.5"}, {"--to 0.5", "--from 0.5"}},
         {{"--to", "0"}, {"--to 0"}},
-        {{"--from", "0.999"}, {"no frame"}},
         {{"--from", "0.5", "--to", "0.501"}, {"no frame"}},
         {{"--to", "0:99"}, {"'0:99'", "is not a time"}},
         {{"--from", "-1"}, {"--from", "'-1'"}},

@@ -25,7 +25,6 @@ TEST_F(Sound, EverySampleArrives) {
         const std::string in = contents("take.wav"), out = contents("out.wav");
         EXPECT_TRUE(wavPart(in, "data") == wavPart(out, "data"));
         EXPECT_EQ(wavPart(in, "fmt ").substr(2, 14).substr(0, 6), wavPart(out, "fmt ").substr(2, 6));
-        EXPECT_EQ(out.size() % 2, 0u);
         const json info = json::parse(tarsel({"info", "out.wav", "--json"}).out)[0]["streams"][0];
         EXPECT_EQ(info["samplerate"], c.rate);
         EXPECT_EQ(info["channels"], c.channels);
