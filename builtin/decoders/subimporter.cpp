@@ -183,6 +183,7 @@ int SubImporter::readFrame(int stream) {
 int SubImporter::readMeta(int stream, int, AnyDict& out) {
     const QvSubtitles& subtitles = opened(stream);
     if (!shown_) return QvStatus::failed;
+    out.set("name", "subtitle");
     out.set("format", static_cast<int>(subtitles.format()));
     out.set("text", shown_->text);
     out.set("rows", shown_->rows);

@@ -46,8 +46,8 @@ class SubImporter : public BaseDecodePipe {
     int seekToFrame(long long frame, int stream) override;
     // 0, or QvStatus::endOfStream behind the end of the last entry.
     int readFrame(int stream) override;
-    // Sets "text", "rows", "start", "end" of what is shown in the frame that was read, and "format". -1 if
-    // nothing is.
+    // Sets "name" ("subtitle"), "text", "rows", "start", "end" of what is shown in the frame that was read,
+    // and "format". -1 if nothing is.
     int readMeta(int stream, int kind, AnyDict& out) override;
     int nrFrames(int stream) const override;  // up to the last entry's end
     MediaTime duration(int type, int stream) override;

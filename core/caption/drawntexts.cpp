@@ -3,7 +3,8 @@
 #include "core/caption/drawntexts_p.h"
 
 bool DrawnText::is(const DrawnTextKey& key) const {
-    return rgb == key.rgb && fourcc == key.fourcc && text == key.text && fieldMasks == key.fieldMasks;
+    return encoding == key.encoding && rgb == key.rgb && fourcc == key.fourcc && text == key.text &&
+           fieldMasks == key.fieldMasks;
 }
 
 DrawnText* DrawnTexts::find(const DrawnTextKey& key) {
@@ -19,6 +20,7 @@ DrawnText& DrawnTexts::renew(const DrawnTextKey& key) {
     std::rotate(texts_.begin(), texts_.end() - 1, texts_.end());
     DrawnText& text = *texts_.front();
     text.text = key.text;
+    text.encoding = key.encoding;
     text.fieldMasks = key.fieldMasks;
     text.rgb = key.rgb;
     text.fourcc = key.fourcc;

@@ -24,6 +24,7 @@ struct DrawnLine {
 // What a text looks like depends on these.
 struct DrawnTextKey {
     std::string_view text;
+    int encoding;  // of QvText
     const AnyVector& fieldMasks;
     unsigned rgb;  // 0xRRGGBB
     unsigned fourcc;
@@ -31,6 +32,7 @@ struct DrawnTextKey {
 
 struct DrawnText {
     std::string text;
+    int encoding = 0;
     AnyVector fieldMasks;
     unsigned rgb = 0;
     unsigned fourcc = 0;

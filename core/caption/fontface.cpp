@@ -64,8 +64,10 @@ void FontFace::load(const FontLibrary& library, const Any& file, int pixels) {
     face_.reset(face);
     if (FT_Select_Charmap(face, FT_ENCODING_UNICODE) != 0)
         qv_dbg()->info("Error: no unicode symbols in font file %s", name.c_str());
-    if (FT_Set_Char_Size(face, 0, static_cast<FT_F26Dot6>(pixels) * 64, 0, 0) != 0)
-        qv_dbg()->info("Error setting char size to: %dpt 72dpi (default)", pixels);
+    const auto size = static_cast<FT_F26Dot6>(pixels) * 64;
+    if (pixels <= largestSize && FT_Set_Char_Size(face, 0, size, 0, 0) == 0) return;
+    qv_dbg()->info("Error setting char size to: %dpt 72dpi (default)", pixels);
+    face_.reset();
 }
 
 unsigned FontFace::indexOf(char32_t character) const {

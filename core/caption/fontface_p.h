@@ -35,6 +35,8 @@ class FontLibrary {
 
 class FontFace {
   public:
+    static constexpr int largestSize = 4096;  // pixels; a letter of it covers the largest pictures
+
     // What fails is told in the debug log and leaves the face without glyphs.
     void load(const FontLibrary& library, const Any& file, int pixels);
     bool usable() const { return face_ != nullptr; }

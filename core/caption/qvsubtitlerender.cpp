@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <string>
+#include <string_view>
 
 #include "core/caption/drawntexts_p.h"
 #include "core/caption/qvsubtitles.h"
@@ -19,12 +20,16 @@ using Options = QvTextRenderingOptions;
 
 constexpr double lineSpacing = 1.15;
 constexpr double bandOverlap = 1.2;  // a band is higher than the step to the next one
-constexpr int largestSize = 32767;   // of letters, in pixels; more than FreeType can draw
 constexpr int farthest = 1 << 28;    // rows; below any picture
 constexpr int widthStep = 32;        // so that a running timecode keeps its pictures' memory
 
 unsigned rgbOf(const QvColor* color) {
     return color && !color->isYuv ? color->bgr32(false) & 0xFFFFFF : 0xFFFFFF;
+}
+
+std::string_view bytesOf(const Any& text) {
+    if (!text.isString() && !text.isGeneric()) return {};
+    return {text.asString(), static_cast<std::size_t>(text.size())};
 }
 
 QvRect common(const QvRect& a, const QvRect& b) {
@@ -89,7 +94,7 @@ struct QvSubtitleRender::Private {
 
     explicit Private(const Options& options)
         : encoding(encodingOf(options)),
-          size(std::clamp(options.charSize, 0, largestSize)),
+          size(std::clamp(options.charSize, 0, FontFace::largestSize)),
           lineHeight(static_cast<int>(size * lineSpacing)),
           effect(options.fontEffect) {
         if (!library.get()) return;
@@ -119,7 +124,7 @@ struct QvSubtitleRender::Private {
 
     void layOut(DrawnText& text) {
         const std::u32string all =
-            encoding == noEncoding ? std::u32string() : QvText::toUtf32(text.text, encoding);
+            text.encoding == noEncoding ? std::u32string() : QvText::toUtf32(text.text, text.encoding);
         FontStyle style = FontStyle::regular;
         std::size_t count = 0;
         for (std::size_t begin = 0; begin <= all.size(); ++count) {
@@ -205,13 +210,10 @@ int QvSubtitleRender::init(const QvTextRenderingOptions& options) {
 int QvSubtitleRender::render(QvFrame& frame, const QvSubtitle& subtitle, const QvColor* color) {
     QV_ASSERT(frame.inited());
     if (!p_ || !p_->library.get()) return QvStatus::ok;
-    const Any narrow = subtitle.text.isWString() ? subtitle.text.toString() : Any();
-    const Any& text = narrow.isValid() ? narrow : subtitle.text;
-    if (!text.isString()) return QvStatus::ok;
-    const DrawnTextKey key{{text.asString(), static_cast<std::size_t>(text.size())},
-                           subtitle.fieldMasks,
-                           rgbOf(color),
-                           frame.four_cc()};
+    const bool wide = subtitle.text.isWString();
+    const Any text = wide ? subtitle.text.toString() : Any();
+    const DrawnTextKey key{bytesOf(wide ? text : subtitle.text), wide ? QvText::utf8 : p_->encoding,
+                           subtitle.fieldMasks, rgbOf(color), frame.four_cc()};
     DrawnText& drawn = p_->textOf(key);
     int offset = 0;
     for (DrawnLine& line : drawn.lines) {

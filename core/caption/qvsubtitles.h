@@ -13,7 +13,8 @@
 // One entry: lines of text that are shown for a time.
 class QV_API QvSubtitle {
   public:
-    Any text = "";  // lines separated by "|"; UTF-8, or bytes as the file of no stated encoding has
+    Any text = "";  // lines separated by "|": a String of UTF-8, or of what bytes a file of no stated
+                    // encoding has; UTF-16 and UTF-32 for the renderer as Generic bytes
     int rows = 1;   // number of lines
     QvPoint position{-1, -1};  // on the picture, from its top left corner; -1, -1: the default place
     MediaTime start;           // at the default timescale

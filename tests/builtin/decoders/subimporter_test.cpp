@@ -1,0 +1,126 @@
+#include "builtin/decoders/subimporter.h"
+
+#include <gtest/gtest.h>
+
+#include <string>
+
+#include "core/engine/qvexception.h"
+#include "core/engine/qvlog.h"
+#include "tests/support/log_capture.h"
+#include "tests/support/temp_folder.h"
+
+namespace {
+
+const char* const srt = "1\n00:00:01,000 --> 00:00:02,000\na|b\n\n2\n00:00:03,000 --> 00:00:04,500\nc\n\n";
+
+class Importer : public testing::Test {
+  protected:
+    Importer() { decoder.init(); }
+    int open(const char* name, const std::string& bytes) {
+        decoder.setParam("filename", folder.write(name, bytes).c_str());
+        decoder.setParam("framerate", QvFramerate(10.0));
+        return decoder.open();
+    }
+    std::string shown() {
+        AnyDict dict;
+        if (decoder.readMeta(0, 0, dict) != 0) return "";
+        EXPECT_EQ(dict["text"], decoder.subtitle()->text);
+        EXPECT_EQ(dict["name"], "subtitle");
+        return dict.getString("text");
+    }
+
+    TempFolder folder;
+    SubImporter decoder;
+};
+
+TEST_F(Importer, DescribesItsStream) {
+    ASSERT_EQ(open("a.srt", srt), 0);
+    EXPECT_EQ(decoder.nrStreams(0), 1);
+    ASSERT_EQ(decoder.nrStreams(qvSubpicStream), 1);
+    AnyDict format;
+    decoder.getStreamParams(qvSubpicStream, 0, format);
+    EXPECT_EQ(format,
+              AnyDict("type", 1, "format", 1, "count", 2, "encoding", 0, "framerate", QvFramerate(10.0),
+                      "first", MediaTime(1.0), "last", MediaTime(3.0), "duration", MediaTime(2.0)));
+    EXPECT_EQ(decoder.getParam("subpic0/count"), 2);
+    EXPECT_EQ(decoder.nrFrames(0), 46);
+    EXPECT_EQ(decoder.duration(qvSubpicStream, 0), MediaTime(4.5));
+    EXPECT_EQ(decoder.getParam("filesize"), static_cast<long long>(std::string(srt).size()));
+}
+
+TEST_F(Importer, EachFrameShowsWhatBelongsToItsTime) {
+    ASSERT_EQ(open("a.srt", srt), 0);
+    std::string seen;
+    int frames = 0;
+    while (decoder.readFrame(0) == 0) {
+        ++frames;
+        seen += shown().empty() ? '.' : shown() == "a|b" ? '1' : '2';
+    }
+    EXPECT_EQ(frames, decoder.nrFrames(0));
+    EXPECT_EQ(seen, "..........11111111111.........2222222222222222");
+    ASSERT_EQ(decoder.seek(MediaTime(2.0), qvSubpicStream, 0), 0);
+    EXPECT_EQ(shown(), "") << "nothing has been read there yet";
+    decoder.readFrame(0);
+    EXPECT_EQ(shown(), "a|b");
+    decoder.readFrame(0);
+    EXPECT_EQ(shown(), "");
+    EXPECT_EQ(decoder.seekToFrame(-1, 0), -4);
+    EXPECT_EQ(decoder.seekToFrame(1LL << 40, 0), -4);
+    ASSERT_EQ(decoder.seekToFrame(2147483647, 0), 0);
+    EXPECT_EQ(decoder.readFrame(0), -4);
+}
+
+TEST_F(Importer, FramesMayBeReadAtAnotherRate) {
+    ASSERT_EQ(open("a.sub", "{10}{20}a\n"), 0);
+    decoder.setParam("readRate", QvFramerate(50.0));
+    EXPECT_EQ(decoder.nrFrames(0), 101);
+    decoder.seekToFrame(49, 0);
+    decoder.readFrame(0);
+    EXPECT_EQ(shown(), "");
+    decoder.readFrame(0);
+    EXPECT_EQ(shown(), "a");
+    EXPECT_EQ(decoder.setParam("readRate", "fast"), -5);
+    EXPECT_EQ(decoder.setParam("framerate", QvFramerate(QvRatio(0, 1))), -5) << "no times without a rate";
+    decoder.setParam("framerate", 20.0);
+    EXPECT_EQ(decoder.getParam("framerate").asFramerate(), QvFramerate(20.0));
+}
+
+TEST_F(Importer, NothingIsAnsweredBeforeOpen) {
+    AnyDict dict;
+    EXPECT_THROW(decoder.nrStreams(0), QvAssertFailure);
+    EXPECT_THROW(decoder.readFrame(0), QvAssertFailure);
+    EXPECT_THROW(decoder.readMeta(0, 0, dict), QvAssertFailure);
+    EXPECT_THROW(decoder.getStreamParams(qvSubpicStream, 0, dict), QvAssertFailure);
+    try {
+        decoder.seekToFrame(0, 0);
+        FAIL();
+    } catch (const QvAssertFailure& failure) {
+        EXPECT_NE(std::string(failure.what()).find("[SubImporter] Not opened"), std::string::npos);
+    }
+    ASSERT_EQ(open("a.srt", srt), 0);
+    EXPECT_THROW(decoder.readFrame(1), QvAssertFailure);
+    EXPECT_THROW(decoder.select(qvVideoStream, 0), QvAssertFailure);
+    decoder.close();
+    EXPECT_THROW(decoder.nrFrames(0), QvAssertFailure);
+    EXPECT_EQ(decoder.subtitle(), nullptr);
+    EXPECT_EQ(decoder.open(), 0) << "and again";
+}
+
+TEST_F(Importer, BadFilesAreRefusedOrTold) {
+    EXPECT_EQ(open("a.sub", "{1}{2}a\n{3"), -9);
+    EXPECT_NE(std::string(decoder.errorDesc()).find("a.sub"), std::string::npos);
+    EXPECT_EQ(open("a.srt", std::string("\0\0\1", 3)), -9);
+    decoder.setParam("filename", folder.file("none.srt").c_str());
+    EXPECT_EQ(decoder.open(), -9);
+    LogCapture log;
+    EXPECT_EQ(open("a.srt", "no subtitles here\n"), 0);
+    EXPECT_TRUE(log.contains("has no subtitles", QvLogMask::warning));
+    EXPECT_EQ(decoder.getSubpicParam(0, "count"), 0);
+    EXPECT_EQ(decoder.readFrame(0), 0);
+    EXPECT_EQ(decoder.readFrame(0), -4);
+    EXPECT_EQ(open("a.srt", std::string(srt) + "3\nno times\n\nmore\n"), 0);
+    EXPECT_TRUE(log.contains("the last 15 bytes of its text are not read", QvLogMask::warning));
+    EXPECT_EQ(decoder.getSubpicParam(0, "truncated"), 1);
+}
+
+}  // namespace

@@ -1,0 +1,69 @@
+// Any bytes open as a subtitle source or are refused; every frame of what opened can be read and drawn.
+#include <algorithm>
+#include <cstdint>
+#include <cstdio>
+#include <cstdlib>
+#include <fstream>
+#include <string>
+
+#include <unistd.h>
+
+#include "builtin/decoders/subimporter.h"
+#include "core/arch/platform.h"
+#include "core/caption/qvsubtitlerender.h"
+#include "core/caption/qvtextrenderingoptions.h"
+#include "core/media/qvbuffer.h"
+
+namespace {
+
+void require(bool holds) {
+    if (!holds) std::abort();
+}
+
+QvTextRenderingOptions optionsFor(const QvFrame& frame) {
+    QvTextRenderingOptions options;
+    options.fontRegular = qv_platform().fontFile(QvFontFace::sans).c_str();
+    options.charSize = frame.height() / 8;
+    options.fontEffect = QvTextRenderingOptions::softShadow;
+    return options;
+}
+
+QvFrame makeFrame() {
+    QvFrame frame;
+    frame.init(QvFourcc::BGR4, 160, 96);
+    frame.setBlack();
+    return frame;
+}
+
+void draw(const QvSubtitle& subtitle) {
+    static QvFrame frame = makeFrame();
+    static QvSubtitleRender render;
+    static const int ready = render.init(optionsFor(frame));
+    require(ready == 0 && render.render(frame, subtitle, nullptr) == 0);
+}
+
+}  // namespace
+
+extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
+    static const std::string name = "/tmp/sub-fuzz-" + std::to_string(getpid()) + ".sub";
+    std::ofstream(name, std::ios::binary)
+        .write(reinterpret_cast<const char*>(data), static_cast<std::streamsize>(size));
+    SubImporter decoder;
+    decoder.init();
+    decoder.setParam("filename", name.c_str());
+    const int status = decoder.open();
+    require(status == 0 || status == -9);
+    if (status == 0) {
+        const int frames = decoder.nrFrames(0);
+        for (const int frame : {0, 1, frames / 2, frames - 1}) {
+            if (decoder.seekToFrame(std::max(frame, 0), 0) != 0) continue;
+            decoder.readFrame(0);
+            AnyDict meta;
+            require((decoder.readMeta(0, 0, meta) == 0) == (decoder.subtitle() != nullptr));
+            if (decoder.subtitle()) draw(*decoder.subtitle());
+        }
+    }
+    decoder.close();
+    std::remove(name.c_str());
+    return 0;
+}
