@@ -1,5 +1,6 @@
 #include <algorithm>
 #include <cstring>
+#include <vector>
 
 #include "core/caption/textlayout_p.h"
 #include "core/caption/textmask_p.h"
@@ -50,16 +51,29 @@ void addMoved(QvFrame& to, const QvFrame& from, int dx, int dy) {
         takeGreater(rowOf(to, y) + std::max(0, dx), rowOf(from, y - dy) + std::max(0, -dx), count);
 }
 
-// Each pixel becomes the mean of its 3 x 3 neighbourhood with the weights 1 2 1; outside there is nothing.
+// A row with the weights 1 2 1; outside there is nothing.
+void sumRow(const Byte* row, int width, unsigned short* sums) {
+    const auto sum = [](int a, int b, int c) { return static_cast<unsigned short>(a + 2 * b + c); };
+    if (width == 1) sums[0] = sum(0, row[0], 0);
+    if (width < 2) return;
+    sums[0] = sum(0, row[0], row[1]);
+    for (int x = 1; x < width - 1; ++x) sums[x] = sum(row[x - 1], row[x], row[x + 1]);
+    sums[width - 1] = sum(row[width - 2], row[width - 1], 0);
+}
+
+// Each pixel becomes the mean of its 3 x 3 neighbourhood, with these weights both ways.
 QvFrame blurred(const QvFrame& mask) {
-    QvFrame out(mask);
-    const auto at = [&mask](int x, int y) -> int {
-        return x < 0 || y < 0 || x >= mask.width() || y >= mask.height() ? 0 : rowOf(mask, y)[x];
-    };
-    const auto line = [&at](int x, int y) { return at(x - 1, y) + 2 * at(x, y) + at(x + 1, y); };
+    const auto width = static_cast<std::size_t>(mask.width());
+    std::vector<unsigned short> sums(width * (static_cast<std::size_t>(mask.height()) + 2));
     for (int y = 0; y < mask.height(); ++y)
-        for (int x = 0; x < mask.width(); ++x)
-            rowOf(out, y)[x] = static_cast<Byte>((line(x, y - 1) + 2 * line(x, y) + line(x, y + 1) + 8) / 16);
+        sumRow(rowOf(mask, y), mask.width(), sums.data() + width * (static_cast<std::size_t>(y) + 1));
+    QvFrame out(mask);
+    for (int y = 0; y < mask.height(); ++y) {
+        const unsigned short* above = sums.data() + width * static_cast<std::size_t>(y);
+        Byte* to = rowOf(out, y);
+        for (std::size_t x = 0; x < width; ++x)
+            to[x] = static_cast<Byte>((above[x] + 2 * above[x + width] + above[x + 2 * width] + 8) / 16);
+    }
     return out;
 }
 
