@@ -18,7 +18,7 @@ constexpr QvBuiltinRow registered[] = {
     {"filesink",     sink,         "File output",                    "File output",                newFilesink},
     {"nullsink",     sink,         "Null sink",                      "Null",                       newNullsink,
      {.internal = true}},
-    {"scaler",       videoFilter,  "Scaler/Color converter",         "Scaler/Color Converter",     nullptr},
+    {"scaler",       videoFilter,  "Scaler/Color converter",         "Scaler/Color Converter",     newScaler},
     {"vprocess",     videoPipe,    "Video processing pipe",          "Video pipe",                 newVprocess},
     {"encpipe",      encodePipe,   "Default exporter",               "Default exporter",           newEncpipe},
     {"dummyaenc",    audioEncoder, "Pass through audio",             "DV Audio",                   newDummyaenc},

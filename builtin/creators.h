@@ -24,3 +24,4 @@ QvCodec* newMemsink();
 QvCodec* newVprocess();
 QvCodec* newAprocess();
 QvCodec* newEncpipe();
+QvCodec* newScaler();

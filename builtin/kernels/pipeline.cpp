@@ -1,0 +1,357 @@
+#include "builtin/kernels/pipeline.h"
+
+#include <algorithm>
+#include <array>
+#include <cstring>
+
+#include "builtin/kernels/deep.h"
+#include "builtin/kernels/lines.h"
+#include "builtin/kernels/rows8.h"
+
+namespace srk {
+
+namespace {
+
+size_t count(int n) { return static_cast<size_t>(n); }
+
+// One field of a picture.
+Picture fieldOf(Picture picture, int fields, int field) {
+    for (auto& plane : picture.planes) {
+        if (!plane.data) continue;
+        plane.data += plane.stride * field;
+        plane.stride *= fields;
+    }
+    return picture;
+}
+
+Byte* lineOf(const Picture& picture, int plane, int y) {
+    const Plane& at = picture.planes[std::min(plane, 2)];
+    return at.data + at.stride * y;
+}
+
+// Full-level samples reach to the end of their range; all others are 256 times as large with 16 bits.
+bool fullRange(const Format& format, int plane) { return plane == 3 || format.family() == Family::rgb; }
+
+template <class S>
+class Band {
+  public:
+    Band(const Plan& plan, Lines<S>& lines, const Picture& source, const Picture& target, int field)
+        : plan_(plan), lines_(lines), source_(source), target_(target), field_(field) {
+        lines_.forget();
+    }
+
+    void targetLine(int y) {
+        const Format& format = *target_.format;
+        if (!format.planar()) return packTarget(y);
+        planeInto(0, y);
+        if (format.planes() == 1 || y % format.down()) return;
+        const int chroma = y / format.down();
+        if (chroma >= chromaGroup().down.target) return;
+        planeInto(1, chroma);
+        planeInto(2, chroma);
+    }
+
+  private:
+    using Word = typename Lines<S>::Word;
+    static constexpr bool deep = sizeof(S) == 2;
+
+    const Scaling& scaling(int stage) const { return stage ? plan_.second[field_] : plan_.scaling[field_]; }
+    const Group& chromaGroup() const { return scaling(plan_.again ? 1 : 0).chroma; }
+
+    // --- Source.
+
+    S* sourcePlace(int plane, int y, bool& fresh) { return lines_.source[plane].at(y, fresh); }
+
+    const S* sourceLine(int plane, int y) {
+        const Format& format = *source_.format;
+        if (plane > 0 && format.has(lumaOnly)) return lines_.neutral.get();
+        if (!format.planar()) return packedSource(plane, y);
+        const Byte* line = lineOf(source_, plane, y);
+        if constexpr (!deep) {
+            return line;
+        } else {
+            bool fresh;
+            S* place = sourcePlace(plane, y, fresh);
+            if (!fresh) return place;
+            if (format.packing == Packing::planar16)
+                raiseWords(place, line, source_.planeWidth(plane), source_.depth);
+            else
+                widen(place, line, count(source_.planeWidth(plane)), false);
+            return place;
+        }
+    }
+
+    const S* packedSource(int plane, int y) {
+        bool fresh, ignored;
+        S* places[4];
+        places[0] = sourcePlace(0, y, fresh);
+        for (int p = 1; p < 4; ++p) places[p] = sourcePlace(p, y, ignored);
+        if (fresh) unpack(y, places);
+        return places[plane];
+    }
+
+    void unpack(int y, S* const places[4]) {
+        const Format& format = *source_.format;
+        const Byte* line = lineOf(source_, 0, y);
+        const int width = source_.width;
+        if constexpr (!deep) {
+            if (plan_.rgbToYuv && format.packing == Packing::bytes4)
+                return rgb4ToYuv(yuvRows(), line, places[0], places[1], places[2], count(width));
+            unpackLine(format, line, Line8{{places[0], places[1], places[2], places[3]}}, width);
+            if (plan_.rgbToYuv)
+                rgbToYuv(yuvRows(), places[0], places[1], places[2], places[0], places[1], places[2],
+                         count(width));
+        } else {
+            if (format.deep()) {
+                const Byte* chroma = format.packing == Packing::nv16 ? lineOf(source_, 1, y) : nullptr;
+                unpackLine(format, line, chroma, Line16{{places[0], places[1], places[2], places[3]}}, width);
+            } else {
+                const Line8 bytes = narrowLines();
+                unpackLine(format, line, bytes, width);
+                for (int p = 0; p < (format.alpha() ? 4 : 3); ++p) {
+                    const int n = p == 1 || p == 2 ? source_.planeWidth(p) : width;
+                    widen(places[p], bytes.plane[p], count(n), fullRange(format, p));
+                }
+            }
+            if (plan_.rgbToYuv) deepMatrix(deepRows(), places, places, width);
+        }
+    }
+
+    const ToYuv& yuvRows() const {
+        return toYuv(plan_.request.targetMatrix, source_.format->family() == Family::video);
+    }
+
+    // The matrix of whichever stage has one.
+    Deep deepRows() const {
+        const auto& request = plan_.request;
+        if (plan_.levels) return deepLevels(plan_.target->family() == Family::video);
+        if (plan_.otherMatrix) return deepToOther(request.sourceMatrix);
+        if (plan_.rgbToYuv)
+            return plan_.floatRgb ? floatToYuv(request.targetMatrix)
+                                  : deepToYuv(request.targetMatrix, plan_.source->family() == Family::video);
+        return plan_.floatRgb ? floatToRgb(request.sourceMatrix)
+                              : deepToRgb(request.sourceMatrix, plan_.target->family() == Family::video);
+    }
+
+    Line8 narrowLines() {
+        Line8 line;
+        for (size_t p = 0; p < 4; ++p) line.plane[p] = lines_.narrow.get() + p * lines_.narrowLength;
+        return line;
+    }
+
+    // --- Scaling.
+
+    const S* upstream(int stage, int plane, int y) {
+        return stage ? matrixedLine(plane, y) : sourceLine(plane, y);
+    }
+
+    const S* scaledLine(int stage, int plane, int y) {
+        const Group& group = scaling(stage).of(plane);
+        if (group.empty()) return lines_.neutral.get();
+        if (group.copies()) return upstream(stage, plane, y + group.down.offset) + group.across.offset;
+        bool fresh;
+        S* place = lines_.stages[stage].out[plane].at(y, fresh);
+        if (fresh) scaledInto(stage, plane, y, place);
+        return place;
+    }
+
+    void scaledInto(int stage, int plane, int y, S* to) {
+        const Group& group = scaling(stage).of(plane);
+        const int width = group.across.target;
+        if (group.empty() || group.copies()) {
+            std::memcpy(to, scaledLine(stage, plane, y), count(width) * sizeof(S));
+            return;
+        }
+        const Axis& down = group.down;
+        const Word* words[maxTaps];
+        for (int t = 0; t < down.taps; ++t) {
+            const int from =
+                down.copies ? y + down.offset : std::clamp(down.start[count(y)] + t, 0, down.source - 1);
+            words[t] = wordLine(stage, plane, from);
+        }
+        if constexpr (deep) {
+            static constexpr float one = 1;
+            deepDown(words, down.copies ? &one : down.exact.data() + count(y) * count(down.taps), down.taps,
+                     to, width);
+        } else {
+            scaleDown(words, down.copies ? nullptr : down.weights.data() + count(y) * count(down.taps),
+                      down.taps, to, width);
+        }
+    }
+
+    const Word* wordLine(int stage, int plane, int y) {
+        bool fresh;
+        Word* place = lines_.stages[stage].words[plane].at(y, fresh);
+        if (!fresh) return place;
+        const Group& group = scaling(stage).of(plane);
+        const S* line = upstream(stage, plane, y);
+        if constexpr (deep) {
+            deepAcross(group.across, line, lines_.paddedWide.get(), place);
+        } else {
+            if (group.bytesAcross.form != Across::copy) {
+                Byte* padded = lines_.padded.get() + beforeLine;
+                padLine(padded, line, group.across.source);
+                line = padded;
+            }
+            scaleAcross(group.bytesAcross, line, place);
+        }
+        return place;
+    }
+
+    // --- Behind scaling.
+
+    bool hasMatrix() const { return plan_.yuvToRgb || plan_.otherMatrix || plan_.levels; }
+
+    const S* matrixedLine(int plane, int y) {
+        if (plane == 3) return scaledLine(0, plane, y);
+        bool fresh, ignored;
+        S* places[3];
+        places[0] = lines_.matrixed[0].at(y, fresh);
+        for (int p = 1; p < 3; ++p) places[p] = lines_.matrixed[p].at(y, ignored);
+        if (fresh) applyMatrix(y, places);
+        return places[plane];
+    }
+
+    void applyMatrix(int y, S* const places[3]) {
+        const S* from[3];
+        for (int p = 0; p < 3; ++p) from[p] = scaledLine(0, p, y);
+        const size_t width = count(plan_.request.width);
+        if constexpr (deep) {
+            deepMatrix(deepRows(), from, places, plan_.request.width);
+        } else if (plan_.yuvToRgb) {
+            yuvToRgb(rgbRows(), from[0], from[1], from[2], places[0], places[1], places[2], width);
+        } else if (plan_.otherMatrix) {
+            for (int p = 0; p < 3; ++p) std::memcpy(places[p], from[p], width);
+            yuvToOther(toOther(plan_.request.sourceMatrix), places[0], places[1], places[2], width);
+        } else {
+            const auto change = plan_.target->family() == Family::video ? toVideoLevels : toFullLevels;
+            for (int p = 0; p < 3; ++p) change(places[p], from[p], width);
+        }
+    }
+
+    const ToRgb& rgbRows() const {
+        return toRgb(plan_.request.sourceMatrix, plan_.target->family() == Family::video);
+    }
+
+    // --- Target.
+
+    const S* finalLine(int plane, int y) {
+        if (plan_.again) return scaledLine(1, plane, y);
+        return hasMatrix() ? matrixedLine(plane, y) : scaledLine(0, plane, y);
+    }
+
+    void finalInto(int plane, int y, S* to, int width) {
+        if (hasMatrix() && !plan_.again)
+            std::memcpy(to, matrixedLine(plane, y), count(width) * sizeof(S));
+        else
+            scaledInto(plan_.again ? 1 : 0, plane, y, to);
+    }
+
+    void planeInto(int plane, int y) {
+        const Format& format = *target_.format;
+        const int width = plane ? plan_.request.width / format.across() : plan_.request.width;
+        Byte* line = lineOf(target_, plane, y);
+        if constexpr (!deep) {
+            finalInto(plane, y, line, width);
+        } else {
+            const bool inPlace = format.packing == Packing::planar16 && target_.depth == 16 &&
+                                 reinterpret_cast<uintptr_t>(line) % alignof(uint16_t) == 0;
+            if (inPlace) return finalInto(plane, y, reinterpret_cast<uint16_t*>(line), width);
+            if (format.packing == Packing::planar16)
+                lowerWords(line, finalLine(plane, y), width, target_.depth);
+            else
+                narrow(line, finalLine(plane, y), count(width), false);
+        }
+    }
+
+    void packTarget(int y) {
+        const Format& format = *target_.format;
+        const int width = plan_.request.width;
+        Byte* line = lineOf(target_, 0, y);
+        if (!deep && plan_.yuvToRgb && packFused(y, line)) return;
+        S* planes[4] = {};
+        for (int p = 0; p < (plan_.alpha ? 4 : 3); ++p) planes[p] = const_cast<S*>(finalLine(p, y));
+        if constexpr (!deep) {
+            packLine(format, Line8{{planes[0], planes[1], planes[2], alphaLine(planes[3])}}, line, width);
+        } else if (format.deep()) {
+            Byte* chroma = format.packing == Packing::nv16 ? lineOf(target_, 1, y) : nullptr;
+            packLine(format, Line16{{planes[0], planes[1], planes[2], planes[3]}}, line, chroma, width);
+        } else {
+            Line8 bytes = narrowLines();
+            for (int p = 0; p < (plan_.alpha ? 4 : 3); ++p) {
+                const int n = p == 1 || p == 2 ? width / format.across() : width;
+                narrow(bytes.plane[p], planes[p], count(n), fullRange(format, p));
+            }
+            bytes.plane[3] = alphaLine(plan_.alpha ? bytes.plane[3] : nullptr);
+            packLine(format, bytes, line, width);
+        }
+    }
+
+    static Byte* alphaLine(Byte* alpha) { return alpha; }
+
+    bool packFused(int y, Byte* line) {
+        if constexpr (!deep) {
+            const auto packing = target_.format->packing;
+            if (packing != Packing::bytes4 && packing != Packing::bytes3) return false;
+            const Byte* from[3];
+            for (int p = 0; p < 3; ++p) from[p] = scaledLine(0, p, y);
+            const size_t width = count(plan_.request.width);
+            (packing == Packing::bytes4 ? yuvToRgb4 : yuvToRgb3)(rgbRows(), from[0], from[1], from[2], line,
+                                                                 width);
+            return true;
+        }
+        return false;
+    }
+
+    const Plan& plan_;
+    Lines<S>& lines_;
+    const Picture &source_, &target_;
+    const int field_;
+};
+
+// Lines as they stand, of every plane.
+void copyLines(const Plan& plan, const Picture& source, const Picture& target, int first, int last) {
+    const Format& format = *plan.target;
+    for (int p = 0; p < format.planes(); ++p) {
+        const int down = p ? format.down() : 1;
+        const auto bytes = static_cast<size_t>(lineBytes(format, plan.request.width, p));
+        const int end = std::min((last + down - 1) / down, target.planeHeight(p));
+        if (bytes == 0) continue;
+        for (int y = (first + down - 1) / down; y < end; ++y)
+            std::memmove(lineOf(target, p, y), lineOf(source, p, y), bytes);
+    }
+}
+
+void shuffleLines(const Plan& plan, const Picture& source, const Picture& target, int first, int last) {
+    const size_t width = count(plan.request.width);
+    const bool fromFours = plan.source->packing == Packing::bytes4,
+               toFours = plan.target->packing == Packing::bytes4;
+    for (int y = first; y < last; ++y) {
+        const Byte* from = lineOf(source, 0, y);
+        Byte* to = lineOf(target, 0, y);
+        if (fromFours && toFours)
+            std::memmove(to, from, 4 * width);
+        else if (fromFours)
+            pack4to3(to, from, width);
+        else
+            pack3to4(to, from, width);
+    }
+}
+
+}  // namespace
+
+void runBand(const Plan& plan, Workspace& workspace, const Picture& source, const Picture& target, int field,
+             int first, int last) {
+    const Picture from = fieldOf(source, plan.fields, field), to = fieldOf(target, plan.fields, field);
+    if (plan.path.from == Core::lines) return copyLines(plan, from, to, first, last);
+    if (plan.path.from == Core::packed8) return shuffleLines(plan, from, to, first, last);
+    if (plan.deep) {
+        Band<uint16_t> band(plan, *workspace.words, from, to, field);
+        for (int y = first; y < last; ++y) band.targetLine(y);
+    } else {
+        Band<Byte> band(plan, *workspace.bytes, from, to, field);
+        for (int y = first; y < last; ++y) band.targetLine(y);
+    }
+}
+
+}  // namespace srk

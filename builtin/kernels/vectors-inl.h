@@ -1,0 +1,86 @@
+// What the vector kernels share, compiled once for each vector unit: include inside the foreach_target file
+// after <hwy/highway.h>.
+#if defined(QV_KERNEL_VECTORS_INL) == defined(HWY_TARGET_TOGGLE)
+#ifdef QV_KERNEL_VECTORS_INL
+#undef QV_KERNEL_VECTORS_INL
+#else
+#define QV_KERNEL_VECTORS_INL
+#endif
+
+HWY_BEFORE_NAMESPACE();
+namespace srk {
+namespace HWY_NAMESPACE {
+namespace hn = hwy::HWY_NAMESPACE;
+
+#if HWY_TARGET != HWY_SCALAR
+
+// At most 32 bytes: wider vectors gain nothing here, and cost clock.
+const hn::CappedTag<uint8_t, 32> d8;
+using D8 = decltype(hn::CappedTag<uint8_t, 32>());
+const hn::Repartition<int8_t, D8> di8;
+const hn::Repartition<int16_t, D8> d16;
+const hn::Repartition<uint16_t, D8> du16;
+const hn::Repartition<int32_t, D8> d32;
+using V8 = hn::Vec<D8>;
+using VI8 = hn::Vec<decltype(hn::Repartition<int8_t, D8>())>;
+using V16 = hn::Vec<decltype(hn::Repartition<int16_t, D8>())>;
+using V32 = hn::Vec<decltype(hn::Repartition<int32_t, D8>())>;
+
+// Each 32-bit lane: the products of its two halves added up.
+HWY_INLINE V32 pairDot(V16 a, V16 b) {
+#if HWY_ARCH_X86
+    V32 unused = hn::Zero(d32);
+    return hn::ReorderWidenMulAccumulate(d32, a, b, hn::Zero(d32), unused);
+#else
+    const auto x = hn::BitCast(d32, a), y = hn::BitCast(d32, b);
+    const auto low =
+        hn::Mul(hn::ShiftRight<16>(hn::ShiftLeft<16>(x)), hn::ShiftRight<16>(hn::ShiftLeft<16>(y)));
+    return hn::Add(low, hn::Mul(hn::ShiftRight<16>(x), hn::ShiftRight<16>(y)));
+#endif
+}
+
+// Each 16-bit lane: the products of its two bytes, pixels by signed weights, added up. The sum must fit.
+HWY_INLINE V16 pairDotBytes(V8 pixels, VI8 weights) {
+#if HWY_ARCH_X86
+#if HWY_TARGET <= HWY_AVX2
+    return V16{_mm256_maddubs_epi16(pixels.raw, weights.raw)};
+#else
+    return V16{_mm_maddubs_epi16(pixels.raw, weights.raw)};
+#endif
+#else
+    const auto p = hn::BitCast(du16, pixels);
+    const auto w = hn::BitCast(d16, weights);
+    const auto low =
+        hn::Mul(hn::BitCast(d16, hn::And(p, hn::Set(du16, 255))), hn::ShiftRight<8>(hn::ShiftLeft<8>(w)));
+    return hn::Add(low, hn::Mul(hn::BitCast(d16, hn::ShiftRight<8>(p)), hn::ShiftRight<8>(w)));
+#endif
+}
+
+// Two 16-bit weights side by side, for pairDot.
+HWY_INLINE V16 pairOf(int first, int second) {
+    const auto packed = static_cast<uint32_t>(static_cast<uint16_t>(first)) | static_cast<uint32_t>(second)
+                                                                                  << 16;
+    return hn::BitCast(d16, hn::Set(d32, static_cast<int32_t>(packed)));
+}
+
+// The lower and upper halves of each 16-byte block with zeros between the bytes, and back with clamping.
+HWY_INLINE V16 lowWords(V8 bytes) { return hn::BitCast(d16, hn::InterleaveLower(d8, bytes, hn::Zero(d8))); }
+HWY_INLINE V16 highWords(V8 bytes) { return hn::BitCast(d16, hn::InterleaveUpper(d8, bytes, hn::Zero(d8))); }
+HWY_INLINE V8 joinWords(V16 low, V16 high) {
+#if HWY_ARCH_X86 && HWY_TARGET <= HWY_AVX2
+    return V8{_mm256_packus_epi16(low.raw, high.raw)};
+#elif HWY_ARCH_X86
+    return V8{_mm_packus_epi16(low.raw, high.raw)};
+#else
+    const hn::Half<decltype(hn::CappedTag<uint8_t, 32>())> half;
+    return hn::Combine(d8, hn::DemoteTo(half, high), hn::DemoteTo(half, low));
+#endif
+}
+
+#endif
+
+}  // namespace HWY_NAMESPACE
+}  // namespace srk
+HWY_AFTER_NAMESPACE();
+
+#endif

@@ -1,0 +1,152 @@
+#include "core/filter/qvcolorconvert.h"
+
+#include <cstdint>
+#include <cstring>
+
+#include "core/engine/qvlog.h"
+#include "core/engine/qvregistry.h"
+#include "core/engine/status.h"
+#include "core/filter/qvfilter.h"
+#include "core/filter/srscaler.h"
+#include "core/media/qvframe.h"
+#include "core/value/qvassert.h"
+
+namespace {
+
+constexpr int videoFilterInterface = 12;
+
+QvVideoFilter* filterOf(QvCodec* codec) {
+    return codec ? static_cast<QvVideoFilter*>(codec->getInterface(videoFilterInterface)) : nullptr;
+}
+
+void takeShape(QvFrame& frame, unsigned fourcc, const QvFrame& like) {
+    if (frame.inited() && frame.four_cc() == fourcc && frame.width() == like.width() &&
+        frame.height() == like.height())
+        return;
+    QV_ASSERT_MSG(frame.init(fourcc, like.width(), like.height()) == QvStatus::ok, "out of memory");
+}
+
+void reversePixels(const QvFrame& in, QvFrame& out) {
+    for (int y = 0; y < in.height(); ++y) {
+        const unsigned char* from = in.plane() + static_cast<std::ptrdiff_t>(in.stride()) * y;
+        unsigned char* to = out.plane() + static_cast<std::ptrdiff_t>(out.stride()) * y;
+        for (int x = 0; x < in.width(); ++x) {
+            uint32_t pixel;
+            std::memcpy(&pixel, from + 4 * x, 4);
+            pixel = __builtin_bswap32(pixel);
+            std::memcpy(to + 4 * x, &pixel, 4);
+        }
+    }
+}
+
+QvScalePicture pictureOf(const QvFrame& frame) {
+    const frame_tt& tt = *frame.getFrame_tt();
+    return {qvFourcc("EXT1"), tt.four_cc,    tt.width,      tt.height,
+            tt.strides[0],    tt.strides[1], tt.strides[2], {tt.planes[0], tt.planes[1], tt.planes[2]}};
+}
+
+uint32_t word(int a, int b, int c) {
+    return static_cast<uint32_t>(a) << 2 | static_cast<uint32_t>(b) << 12 | static_cast<uint32_t>(c) << 22;
+}
+
+constexpr int groupPixels = 6, groupBytes = 16;
+
+void packLine(const unsigned char* y, const unsigned char* u, const unsigned char* v, unsigned char* to,
+              int width) {
+    const int groups = width / groupPixels;
+    for (int g = 0; g < groups; ++g, y += 6, u += 3, v += 3, to += groupBytes) {
+        const uint32_t words[4] = {word(u[0], y[0], v[0]), word(y[1], u[1], y[2]), word(v[1], y[3], u[2]),
+                                   word(y[4], v[2], y[5])};
+        for (int i = 0; i < 4; ++i)
+            for (int k = 0; k < 4; ++k) to[4 * i + k] = static_cast<unsigned char>(words[i] >> 8 * k);
+    }
+    std::memset(to, 0, static_cast<size_t>(width - groups * groupPixels));
+}
+
+}  // namespace
+
+QvColorConverter::QvColorConverter(unsigned int fourcc, bool itu709To601, bool itu601To709)
+    : codec_(qv_registry()->newCodec("scaler")), width_(320), height_(240) {
+    QV_ASSERT_MSG(filterOf(codec_.get()),
+                  "Tarsel library not initialized, can not create colorconverter module");
+    if (itu709To601 || itu601To709) {
+        codec_->setParam("inITU", itu709To601 ? 2 : 1);
+        codec_->setParam("outITU", itu709To601 ? 1 : 2);
+    }
+    codec_->setParam("outWidth", width_);
+    codec_->setParam("outHeight", height_);
+    codec_->setParam("FOURCC", static_cast<int>(fourcc));
+    open_ = codec_->open() == QvStatus::ok;
+    QV_ASSERT_MSG(open_, "Invalid input four cc given");
+}
+
+QvColorConverter::~QvColorConverter() = default;
+
+bool QvColorConverter::_inputFormatChanged(const QvFrame& in) const {
+    return in.width() != width_ || in.height() != height_;
+}
+
+int QvColorConverter::_reopenConverter(const QvFrame& in) {
+    codec_->close();
+    width_ = in.width();
+    height_ = in.height();
+    codec_->setParam("outWidth", width_);
+    codec_->setParam("outHeight", height_);
+    const int result = codec_->open();
+    if (result != QvStatus::ok) width_ = height_ = 0;  // so that the next frame tries again
+    return result;
+}
+
+int QvColorConverter::convert(const QvFrame& in, QvFrame& out) {
+    QV_ASSERT_MSG(codec_ && open_ && in.inited(), "converter in invalid state");
+    QvVideoFilter* filter = filterOf(codec_.get());
+    if (_inputFormatChanged(in))
+        if (const int result = _reopenConverter(in)) {
+            qv_dbg()->error("Failed to reopen color converter, input FCC=%s, w=%d, h=%d", in.str_four_cc(),
+                            in.width(), in.height());
+            return result;
+        }
+    if (const int result = filter->write(const_cast<QvFrame&>(in))) {
+        qv_dbg()->error("Failed to color convert, input FCC=%s, w=%d, h=%d", in.str_four_cc(), in.width(),
+                        in.height());
+        return result;
+    }
+    QV_ASSERT(filter->ready() > 0);
+    out = *filter->frame();
+    filter->next();
+    return QvStatus::ok;
+}
+
+void qvColorARGBToBGR4(const QvFrame& in, QvFrame& out) {
+    QV_ASSERT(in.inited() && in.four_cc() == QvFourcc::ARGB);
+    takeShape(out, QvFourcc::BGR4, in);
+    reversePixels(in, out);
+}
+
+void qvColorBGR4ToARGB(const QvFrame& in, QvFrame& out) {
+    QV_ASSERT(in.inited() && qvEqualFourcc(in.four_cc(), QvFourcc::BGR4));
+    takeShape(out, QvFourcc::ARGB, in);
+    reversePixels(in, out);
+}
+
+void qvColorYUYVToI422(const QvFrame& in, QvFrame& out) {
+    QV_ASSERT(in.inited());
+    takeShape(out, QvFourcc::I422, in);
+    const QvScalePicture source = pictureOf(in);
+    QvScalePicture target = pictureOf(out);
+    const unsigned flags = in.framerate.interlaced() ? QvScale::interlaced : 0;
+    const int done =
+        SRScaler(0, source.tag, &source, 0, 0, 0, target.tag, &target, 0, 0, 0, 0, flags, nullptr);
+    QV_ASSERT_MSG(done == 1, "SRScaler() failed");
+}
+
+void qvColorYUYVToV210(const QvFrame& in, unsigned char* dest, QvFrame& scratch) {
+    qvColorYUYVToI422(in, scratch);
+    const int width = scratch.width();
+    const std::ptrdiff_t lineBytes = (width + 47) / 48 * std::ptrdiff_t{128};
+    for (int y = 0; y < scratch.height(); ++y)
+        packLine(scratch.plane(0) + static_cast<std::ptrdiff_t>(scratch.stride(0)) * y,
+                 scratch.plane(1) + static_cast<std::ptrdiff_t>(scratch.stride(1)) * y,
+                 scratch.plane(2) + static_cast<std::ptrdiff_t>(scratch.stride(2)) * y, dest + lineBytes * y,
+                 width);
+}
