@@ -4,12 +4,12 @@
 #include <string>
 #include <string_view>
 
+#include "core/caption/bandconverter_p.h"
 #include "core/caption/drawntexts_p.h"
 #include "core/caption/qvsubtitles.h"
 #include "core/caption/qvtext.h"
 #include "core/caption/qvtextrenderingoptions.h"
 #include "core/caption/textmask_p.h"
-#include "core/engine/qvlog.h"
 #include "core/engine/status.h"
 #include "core/media/qvdraw.h"
 #include "core/value/qvassert.h"
@@ -41,6 +41,14 @@ QvRect common(const QvRect& a, const QvRect& b) {
 // Blending moves what it draws to even coordinates, so that a picture must begin and end on them.
 QvRect madeEven(const QvRect& rect) {
     return QvRect(rect.left() & ~1, rect.top() & ~1, (rect.right() + 1) & ~1, (rect.bottom() + 1) & ~1);
+}
+
+// Smaller pictures can't be converted. What lies outside the target is left out when it is drawn.
+QvRect largeEnough(const QvRect& rect) {
+    constexpr int least = 4;
+    if (rect.width() == 0) return rect;
+    return QvRect(rect.left(), rect.top(), std::max(rect.right(), rect.left() + least),
+                  std::max(rect.bottom(), rect.top() + least));
 }
 
 bool shape(QvFrame& frame, unsigned fourcc, const QvRect& area) {
@@ -89,7 +97,8 @@ struct QvSubtitleRender::Private {
     int lineHeight;
     int effect;
     DrawnTexts texts;
-    QvFrame band;     // BGR4, on its way to another format or into an effect
+    QvFrame band;  // BGR4, on its way to another format or into an effect
+    BandConverter converter;
     QvFrame letters;  // GRAY, on its way into an effect
 
     explicit Private(const Options& options)
@@ -162,7 +171,7 @@ struct QvSubtitleRender::Private {
     // Draws what of a line can be seen with its band at `place`, unless that has been drawn already.
     bool prepare(const DrawnText& text, DrawnLine& drawn, const QvFrame& frame, const QvPoint& place) {
         const QvRect picture(-place.x(), -place.y(), frame.width() - place.x(), frame.height() - place.y());
-        const QvRect area = madeEven(common(drawn.covered, picture));
+        const QvRect area = largeEnough(madeEven(common(drawn.covered, picture)));
         if (area.width() == 0) return false;
         if (drawn.drawn == area) return true;
         drawn.drawn = QvRect();
@@ -178,7 +187,7 @@ struct QvSubtitleRender::Private {
         drawLetters(drawn.line, size, text.fieldMasks, area, drawn.mask);
         fill(colours, text.rgb);
         if (effect != Options::noEffect) applyEffect(text.rgb, colours, drawn.mask);
-        return direct || convert(text.fourcc, drawn.colours);
+        return direct || converter.convert(band, text.fourcc, drawn.colours);
     }
 
     // Letters of the colour on black, which the mask then shows around them.
@@ -191,11 +200,6 @@ struct QvSubtitleRender::Private {
         outlineMask(letters, mask, 1);
         if (effect == Options::softShadow || effect == Options::hardShadow)
             addShadow(mask, effect == Options::softShadow);
-    }
-
-    bool convert(unsigned, QvFrame&) {
-        qv_dbg()->error("Text can be drawn on BGR4 only");
-        return false;
     }
 };
 

@@ -10,6 +10,7 @@
 //     top of the first band = height - charSize / 2 - L * rows
 //
 // "<i>", "<b>", "</i>" and "</b>" in a text change the face up to the end of the subtitle and are not drawn.
+// "<u>", "<s>", "<font ...>", their ends, "{\...}" and "{y:...}", which other players know, are passed over.
 // Text of right-to-left scripts is put in its order and shaped.
 #pragma once
 

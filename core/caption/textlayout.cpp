@@ -7,15 +7,40 @@ namespace {
 
 constexpr long long firstPen = 64;  // a pixel of room for what hangs over to the left
 
+using View = std::u32string_view;
+
 constexpr struct {
-    std::u32string_view text;
+    View text;
     FontStyle style;
-} tags[] = {
+} styleTags[] = {
     {U"<i>", FontStyle::italic},
     {U"<b>", FontStyle::bold},
     {U"</i>", FontStyle::regular},
     {U"</b>", FontStyle::regular},
 };
+
+// What other players take for colours, places and lines under the text; it is nothing to be read.
+constexpr View plainTags[] = {U"<u>", U"</u>", U"<s>", U"</s>", U"<font>", U"</font>"};
+
+bool opensHiddenTag(View text) {
+    const bool code = text.size() > 2 && text[0] == U'{' && text[2] == U':' && (text[1] | 0x20) >= U'a' &&
+                      (text[1] | 0x20) <= U'z';  // "{y:i}" of SUB files
+    return code || text.starts_with(U"<font ") || text.starts_with(U"{\\");
+}
+
+// Characters of the tag that a text begins with, 0 without one.
+std::size_t tagAt(View text, FontStyle& style) {
+    if (text[0] != U'<' && text[0] != U'{') return 0;
+    for (const auto& tag : styleTags)
+        if (text.starts_with(tag.text)) {
+            style = tag.style;
+            return tag.text.size();
+        }
+    for (const View tag : plainTags)
+        if (text.starts_with(tag)) return tag.size();
+    if (!opensHiddenTag(text)) return 0;
+    return text.find(text[0] == U'<' ? U'>' : U'}') + 1;  // an open one is text
+}
 
 // Controls, and marks that only steer the layout; no font has a picture for them.
 bool isInvisible(char32_t c) {
@@ -23,16 +48,12 @@ bool isInvisible(char32_t c) {
            (c >= 0x2060 && c <= 0x2069) || c == 0xFEFF;
 }
 
-std::vector<StyledCharacter> withoutTags(std::u32string_view line, FontStyle& style) {
+std::vector<StyledCharacter> withoutTags(View line, FontStyle& style) {
     std::vector<StyledCharacter> text;
     text.reserve(line.size());
     for (std::size_t at = 0; at < line.size();) {
-        const auto rest = line.substr(at);
-        const auto tag = std::find_if(std::begin(tags), std::end(tags),
-                                      [&](const auto& t) { return rest.starts_with(t.text); });
-        if (tag != std::end(tags)) {
-            style = tag->style;
-            at += tag->text.size();
+        if (const std::size_t tag = tagAt(line.substr(at), style)) {
+            at += tag;
             continue;
         }
         text.push_back({line[at], style, static_cast<int>(at)});
@@ -62,7 +83,7 @@ void placeInOrder(std::span<const StyledCharacter> text, FontFaces& faces, TextL
 
 }  // namespace
 
-TextLine layOutLine(std::u32string_view text, FontFaces& faces, FontStyle& style) {
+TextLine layOutLine(View text, FontFaces& faces, FontStyle& style) {
     TextLine line;
     const auto characters = withoutTags(text, style);
     if (needsShaping(characters))

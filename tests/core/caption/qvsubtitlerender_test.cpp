@@ -3,12 +3,17 @@
 #include <gtest/gtest.h>
 
 #include <climits>
+#include <cstring>
 #include <functional>
+#include <memory>
 #include <string>
 
 #include "core/arch/platform.h"
 #include "core/caption/qvsubtitles.h"
 #include "core/caption/qvtextrenderingoptions.h"
+#include "core/engine/init.h"
+#include "core/engine/qvcodec.h"
+#include "core/engine/qvregistry.h"
 #include "core/media/qvbuffer.h"
 #include "core/media/qvdraw.h"
 #include "tests/support/log_capture.h"
@@ -116,7 +121,9 @@ TEST_F(Render, TagsChooseTheFaceAndAreNotDrawn) {
     EXPECT_EQ(picture("<b>HHH</b>H"), plain) << "a font that is not there draws nothing";
     EXPECT_EQ(picture("<b>HHH"), blank());
     EXPECT_EQ(picture("<b>H|H</b>"), blank()) << "a tag goes on to the next line";
-    EXPECT_NE(picture("<u>H</u>"), plain) << "no other tag is known";
+    EXPECT_EQ(picture("<font color=\"#00ff00\"><u>H</u></font>{\\an8}{c:$0000ff}"), plain);
+    for (const char* text : {"<H", "H>", "<font H", "{\\H", "{H}", "{1:H}", "<x>H"})
+        EXPECT_NE(picture(text), plain) << text;
     options.fontItalic = qv_platform().fontFile(QvFontFace::sansItalic).c_str();
     EXPECT_NE(picture("<i>H</i>"), plain);
     QvSubtitle open, next;
@@ -268,6 +275,41 @@ TEST_F(Render, EncodingsAreRead) {
     clear(640, 241);
     render.render(frame, subtitle, nullptr);
     EXPECT_EQ(fingerprint(), expected) << "wide text needs no encoding";
+}
+
+// Rows of the first plane that differ between two pictures.
+QvPoint changedRows(const QvFrame& a, const QvFrame& b) {
+    QvPoint rows(INT_MAX, INT_MIN);
+    for (int y = 0; y < a.height(); ++y)
+        if (std::memcmp(a.plane() + y * a.stride(), b.plane() + y * b.stride(),
+                        static_cast<std::size_t>(a.stride())) != 0)
+            rows = QvPoint(std::min(rows.x(), y), y);
+    return rows;
+}
+
+TEST_F(Render, EveryFormatHasTheTextInItsPlace) {
+    init_wrapper(nullptr);
+    if (!std::unique_ptr<QvCodec>(qv_registry()->newCodec("scaler")))
+        GTEST_SKIP() << "this build can't convert";
+    draw("H", 1, {100, 20});
+    const QvRect ink = inked(0, 241);
+    QvSubtitle subtitle;
+    subtitle.text = "H";
+    subtitle.position = QvPoint(100, 20);
+    QvSubtitleRender render;
+    render.init(options);
+    for (const unsigned fourcc :
+         {QvFourcc::I420, QvFourcc::YUY2, QvFourcc::BGR3, QvFourcc::ARGB, QvFourcc::I420}) {
+        QvFrame target;
+        target.init(fourcc, 640, 242);
+        target.setBlack();
+        const QvFrame before(target);
+        render.render(target, subtitle, nullptr);
+        const QvPoint rows = changedRows(before, target);
+        EXPECT_NEAR(rows.x(), ink.top(), 1) << target.str_four_cc();
+        EXPECT_NEAR(rows.y(), ink.bottom() - 1, 1) << target.str_four_cc();
+    }
+    cleanup_wrapper();
 }
 
 TEST(RenderWithoutFonts, SaysSoAndDrawsNothing) {
