@@ -189,7 +189,10 @@ void QvTranscodeRun::audioTurn() {
         const int before = result_;
         link(*audio, audioDue(*audio));
         if (result_ == QvStatus::ok && before != QvStatus::ok) result_ = before;
-        if (video_.empty()) allDone_ = allDone_ && audio->finished();
+        // Sound of no length is never asked for anything, so it can't tell that it has finished.
+        const auto& sound = static_cast<const TransALink&>(*audio);
+        const bool complete = sound.finished() || sound.outProcessed() >= sound.totalOutSamples();
+        if (video_.empty()) allDone_ = allDone_ && complete;
     }
 }
 

@@ -95,8 +95,7 @@ int TransALink::open(const AnyDict* params) {
     }
     processed_ = -1;
     steps_ = 0;
-    silenceLogged_ = worked_ = false;
-    finished_ = totalOutSamples_ < 1;  // a run of sound alone asks for nothing and would never end
+    finished_ = silenceLogged_ = worked_ = false;
     opened_ = true;
     return QvStatus::ok;
 }

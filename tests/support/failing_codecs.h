@@ -40,6 +40,7 @@ class FailingOutputs {
     std::string failAt;
     How how = status;
     std::vector<std::string> calls;
+    std::string watched;  // a parameter, as "rawvenc.meta"; setting it is a call "rawvenc.meta=1" or "=0"
     AnyDict params;  // answers of the multiplexer and encoders that replace their own, as "rawmux.maxStreams"
 
   private:
@@ -74,6 +75,11 @@ class FailingOutputs {
                 value = instead;
             else
                 Base::getParam(name, value);
+        }
+        int setParam(const char* name, const Any& value) override {
+            const std::string call = std::string(this->name()) + "." + name;
+            if (call == self_->watched) self_->calls.push_back(call + (value.isTrue() ? "=1" : "=0"));
+            return Base::setParam(name, value);
         }
         using QvCodec::getParam;
         int fail(const std::string& text) { return this->setError(failure, "%s", text.c_str()); }

@@ -67,6 +67,14 @@ TEST_F(Transcoder, AnAudioOnlyRunEndsAtTheLastSample) {
     EXPECT_EQ(text.substr(0, 15), "open open a2000");
     EXPECT_EQ(job.pipe.audios[0]->total, 48000);
     EXPECT_EQ(t.rounds, 24);
+
+    Job silent;
+    silent.pipe.videoStreams = 0;
+    silent.decoder.tracks[0]->params.set("samples", 0LL);
+    ASSERT_EQ(silent.task.link(&silent.decoder, 2, 0, 0), 0);
+    NotedTranscoder none(silent.events, &silent.task);
+    EXPECT_EQ(none.transcode(true), 0);
+    EXPECT_EQ(silent.events.take(), "open open 0.00 close done0");
 }
 
 // How a run ends and who gets to know what.
