@@ -1,0 +1,424 @@
+#include <gtest/gtest.h>
+
+#include <cstring>
+#include <functional>
+#include <map>
+#include <memory>
+
+#include "core/encode/qvencodepipe.h"
+#include "core/engine/init.h"
+#include "core/engine/qvexception.h"
+#include "core/engine/qvutil.h"
+#include "core/preset/qvprofile.h"
+#include "core/stream/qvbufstrm.h"
+#include "tests/support/pictures.h"
+#include "tests/support/temp_folder.h"
+
+namespace {
+
+// Reads an AVI file by its structure alone, and checks on the way what a reader relies on: lengths that fit
+// into each other, and indexes that name exactly the chunks that are there.
+class AviReader {
+  public:
+    struct Chunk {
+        std::string id;
+        size_t data, bytes;
+    };
+    struct Stream {
+        std::string type, handler, format;
+        unsigned scale, rate, length, largest, unitBytes;
+        std::vector<Chunk> chunks;    // by the super index
+        std::vector<unsigned> units;  // that each of its places covers
+    };
+
+    explicit AviReader(std::string bytes) : bytes_(std::move(bytes)) {
+        segments();
+        EXPECT_EQ(declared_, streams.size());
+        for (size_t i = 0; i < streams.size(); ++i) readIndex(i);
+    }
+
+    unsigned long long number(size_t at, int width) const {
+        unsigned long long value = 0;
+        for (int i = width; i-- > 0;)
+            value = value << 8 | static_cast<unsigned char>(bytes_.at(at + static_cast<size_t>(i)));
+        return value;
+    }
+    std::string text(size_t at) const { return bytes_.substr(at, 4); }
+    std::string data(const Chunk& chunk) const { return bytes_.substr(chunk.data, chunk.bytes); }
+    std::string all(size_t stream) const {
+        std::string joined;
+        for (const auto& chunk : streams[stream].chunks) joined += data(chunk);
+        return joined;
+    }
+
+    int riffs = 0;
+    size_t longest = 0;
+    unsigned microseconds = 0, firstFrames = 0, totalFrames = 0, width = 0, height = 0;
+    std::vector<Stream> streams;
+    std::vector<Chunk> inOrder;  // of all segments
+    std::vector<Chunk> oldIndex;
+
+  private:
+    void segments() {
+        for (size_t at = 0; at < bytes_.size(); ++riffs) {
+            ASSERT_EQ(text(at), "RIFF");
+            ASSERT_EQ(text(at + 8), riffs == 0 ? "AVI " : "AVIX");
+            const size_t end = at + 8 + number(at + 4, 4);
+            ASSERT_LE(end, bytes_.size());
+            longest = std::max(longest, end - at);
+            lists(at + 12, end, at);
+            at = end;
+        }
+    }
+    void lists(size_t at, size_t end, size_t riff) {
+        while (at < end) {
+            const std::string id = text(at);
+            const size_t data = at + 8, bytes = number(at + 4, 4);
+            ASSERT_LE(data + bytes, end) << id;
+            if (id == "LIST") {
+                if (text(data) == "movi") movi_ = data;
+                lists(data + 4, data + bytes, riff);
+            } else {
+                chunk({id, data, bytes}, riff);
+            }
+            at = data + bytes + bytes % 2;
+        }
+        EXPECT_EQ(at, end);
+    }
+    void chunk(const Chunk& c, size_t riff) {
+        const auto word = [&](size_t at) { return static_cast<unsigned>(number(c.data + at, 4)); };
+        if (c.id == "avih") {
+            microseconds = word(0), firstFrames = word(16), width = word(32), height = word(36);
+            declared_ = word(24);
+        } else if (c.id == "strh") {
+            streams.push_back({text(c.data),
+                               text(c.data + 4),
+                               "",
+                               word(20),
+                               word(24),
+                               word(32),
+                               word(36),
+                               word(44),
+                               {},
+                               {}});
+        } else if (c.id == "strf") {
+            streams.back().format = bytes_.substr(c.data, c.bytes);
+        } else if (c.id == "indx") {
+            super_.push_back(c);
+        } else if (c.id == "dmlh") {
+            totalFrames = word(0);
+        } else if (c.id == "idx1") {
+            for (size_t at = 0; at < c.bytes; at += 16)
+                oldIndex.push_back({text(c.data + at), movi_ + word(at + 8) + 8, word(at + 12)});
+        } else if (c.id.substr(0, 2) == "ix") {
+            EXPECT_EQ(number(c.data + 12, 8), riff);
+        } else {
+            inOrder.push_back(c);
+        }
+    }
+    void readIndex(size_t number_) {
+        const Chunk& places = super_.at(number_);
+        auto& stream = streams[number_];
+        for (size_t i = 0; i < number(places.data + 4, 4); ++i) {
+            const size_t place = places.data + 24 + i * 16, index = number(place, 8);
+            ASSERT_EQ(text(index).substr(0, 2), "ix");
+            EXPECT_EQ(number(index + 4, 4) + 8, number(place + 8, 4));
+            stream.units.push_back(static_cast<unsigned>(number(place + 12, 4)));
+            const size_t base = number(index + 20, 8);
+            for (size_t e = 0; e < number(index + 12, 4); ++e) {
+                const size_t data = base + number(index + 32 + e * 8, 4);
+                stream.chunks.push_back({text(data - 8), data, number(index + 36 + e * 8, 4)});
+                EXPECT_EQ(number(data - 4, 4), stream.chunks.back().bytes);
+                EXPECT_EQ(stream.chunks.back().id, text(index + 16));
+            }
+        }
+    }
+
+    std::string bytes_;
+    size_t movi_ = 0;
+    unsigned declared_ = 0;
+    std::vector<Chunk> super_;
+};
+
+class RawAvi : public testing::Test {
+  protected:
+    RawAvi() {
+        init_wrapper(nullptr);
+        pipe_.reset(QvEncodePipe::create());
+        EXPECT_EQ(pipe_->applyPreset(QvProfile::aviRaw, 0), 0);
+        pipe_->clearStreams();
+        pipe_->setFilename(Any(folder_.file("out.avi").c_str()));
+    }
+    ~RawAvi() override {
+        pipe_.reset();
+        cleanup_wrapper();
+    }
+
+    void video(unsigned type, int width, int height, const QvFramerate& rate = QvFramerate(25.0)) {
+        const int nr = pipe_->addVideoStream("rawvenc");
+        ASSERT_GE(nr, 0);
+        for (const auto& [name, value] : std::map<const char*, Any>{
+                 {"type", static_cast<int>(type)}, {"width", width}, {"height", height}, {"framerate", rate}})
+            ASSERT_EQ(pipe_->videoEncoder(nr)->setParam(name, value), 0);
+    }
+    void audio(int channels, int bits, int samplerate) {
+        const int nr = pipe_->addAudioStream("rawaenc");
+        ASSERT_GE(nr, 0);
+        for (const auto& [name, value] : std::map<const char*, Any>{
+                 {"channels", channels}, {"bitsPerSample", bits}, {"samplerate", samplerate}})
+            ASSERT_EQ(pipe_->audioEncoder(nr)->setParam(name, value), 0);
+    }
+    AviReader read() { return AviReader(TempFolder::read(folder_.file("out.avi"))); }
+
+    TempFolder folder_;
+    std::unique_ptr<QvEncodePipe> pipe_;
+};
+
+// What a picture has to be in the file, pixel by pixel.
+std::string inFile(const QvFrame& frame, const std::vector<int>& planes, bool bottomUp, int rowBytes,
+                   int chromaRowBytes = 0) {
+    std::string all;
+    for (const int plane : planes) {
+        const int rows = plane ? (frame.height() + 1) / 2 : frame.height();
+        const int source = plane ? frame.height() / 2 : frame.height();
+        const int bytes = plane ? chromaRowBytes : rowBytes;
+        for (int row = 0; row < rows; ++row) {
+            const int from = std::min(bottomUp ? rows - 1 - row : row, source - 1);
+            std::string line(reinterpret_cast<const char*>(frame.plane(plane)) + from * frame.stride(plane),
+                             static_cast<size_t>(std::min(bytes, frame.stride(plane))));
+            const size_t again = planes.size() > 1 ? 1 : 4;
+            while (line.size() < static_cast<size_t>(bytes)) line += line[line.size() - again];
+            if (bottomUp) line.resize(line.size() + (4 - line.size() % 4) % 4);
+            all += line;
+        }
+    }
+    return all;
+}
+
+TEST_F(RawAvi, PicturesOfEachType) {
+    struct Row {
+        unsigned type;
+        const char* handler;
+        unsigned compression;
+        int bits;
+        std::function<std::string(const QvFrame&, int)> expected;
+    };
+    const std::vector<int> one = {0}, yuv = {0, 1, 2}, yvu = {0, 2, 1};
+    const auto packed = [&](const QvFrame& f, int w) { return inFile(f, one, false, (w + 1) / 2 * 4); };
+    const Row rows[] = {
+        {QvFourcc::BGR3, "DIB ", 0, 24, [&](auto& f, int w) { return inFile(f, one, true, 3 * w); }},
+        {QvFourcc::BGR4, "DIB ", 0, 32, [&](auto& f, int w) { return inFile(f, one, true, 4 * w); }},
+        {QvFourcc::I420, "I420", QvFourcc::I420, 12,
+         [&](auto& f, int w) { return inFile(f, yuv, false, w, (w + 1) / 2); }},
+        {QvFourcc::YV12, "YV12", QvFourcc::YV12, 12,
+         [&](auto& f, int w) { return inFile(f, yvu, false, w, (w + 1) / 2); }},
+        {QvFourcc::YUYV, "YUY2", QvFourcc::YUY2, 16, packed},
+        {QvFourcc::UYVY, "UYVY", QvFourcc::UYVY, 16, packed},
+        {QvFourcc::Y216, "Y216", QvFourcc::Y216, 32, [](auto& f, int) { return pictureBytes(f); }},
+    };
+    for (const auto& row : rows)
+        for (const auto& [width, height] : {std::pair{64, 32}, {51, 35}, {1500, 300}}) {
+            SCOPED_TRACE(testing::Message() << row.handler << row.bits << " " << width << "x" << height);
+            pipe_->clearStreams();
+            video(row.type, width, height);
+            ASSERT_EQ(pipe_->open(), 0) << pipe_->errorDesc();
+            std::vector<std::string> expected;
+            for (unsigned i = 0; i < 3; ++i) {
+                QvFrame frame = makePicture(row.type, width, height, i);
+                ASSERT_EQ(pipe_->writeFrame(&frame, 0), 0);
+                expected.push_back(row.expected(frame, width));
+            }
+            ASSERT_EQ(pipe_->close(), 0);
+            const auto avi = read();
+            ASSERT_EQ(avi.streams.size(), 1u);
+            const auto& stream = avi.streams[0];
+            EXPECT_EQ(stream.handler, row.handler);
+            ASSERT_EQ(stream.chunks.size(), 3u);
+            for (size_t i = 0; i < 3; ++i) EXPECT_TRUE(avi.data(stream.chunks[i]) == expected[i]);
+            const auto field = [&](size_t at, size_t bytes) {
+                unsigned value = 0;
+                std::memcpy(&value, stream.format.data() + at, bytes);
+                return value;
+            };
+            ASSERT_EQ(stream.format.size(), 40u);
+            EXPECT_EQ(field(4, 4), static_cast<unsigned>(width));
+            EXPECT_EQ(field(8, 4), static_cast<unsigned>(height));
+            EXPECT_EQ(field(14, 2), static_cast<unsigned>(row.bits));
+            EXPECT_EQ(field(16, 4), row.compression);
+            EXPECT_EQ(field(20, 4), expected[0].size());
+            EXPECT_EQ(stream.largest, expected[0].size());
+        }
+}
+
+// A short limit makes many segments; the sound comes in pieces of other lengths than the pictures ask for.
+TEST_F(RawAvi, SegmentsAndInterleaving) {
+    constexpr int frames = 40, rate = 44100;
+    const QvFramerate ntsc(QvRatio(30000, 1001));
+    pipe_->getMuxer()->setParam("riffBytes", 20000);
+    pipe_->getMuxer()->setParam("segments", 64);
+    video(QvFourcc::YUYV, 32, 32, ntsc);
+    audio(1, 8, rate);
+    audio(2, 16, 48000);
+    ASSERT_EQ(pipe_->open(), 0) << pipe_->errorDesc();
+    std::string pictures, mono, stereo;
+    const auto sound = [&](int nr, int count, std::string& all) {
+        QvPcm pcm;
+        fillSound(pcm, count, nr + 1, nr + 1, nr ? 48000 : rate, static_cast<unsigned>(all.size()));
+        ASSERT_EQ(pipe_->writePcm(&pcm, nr), 0);
+        all += soundBytes(pcm);
+    };
+    for (int i = 0; i < frames; ++i) {
+        QvFrame frame = makePicture(QvFourcc::YUYV, 32, 32, static_cast<unsigned>(i));
+        ASSERT_EQ(pipe_->writeFrame(&frame, 0), 0);
+        pictures += pictureBytes(frame);
+        if (i % 7 == 0) sound(0, static_cast<int>(QvUtil::samplesForFrames(7, ntsc, rate)) + 1, mono);
+        for (const int part : {1, 1600}) sound(1, part, stereo);
+    }
+    ASSERT_EQ(pipe_->close(), 0);
+
+    const auto avi = read();
+    EXPECT_GT(avi.riffs, 10);
+    EXPECT_LE(avi.longest, 20000u + 64 * 16 * 3 + 1000);  // the first holds the headers, too
+    ASSERT_EQ(avi.streams.size(), 3u);
+    const std::string* given[] = {&pictures, &mono, &stereo};
+    const unsigned rates[] = {30000, rate, 48000}, scales[] = {1001, 1, 1}, units[] = {2048, 1, 4};
+    for (size_t i = 0; i < 3; ++i) {
+        const auto& stream = avi.streams[i];
+        EXPECT_TRUE(avi.all(i) == *given[i]) << i;
+        EXPECT_EQ(stream.type, i ? "auds" : "vids");
+        EXPECT_EQ(stream.rate, rates[i]);
+        EXPECT_EQ(stream.scale, scales[i]);
+        EXPECT_EQ(stream.length, given[i]->size() / units[i]);
+        EXPECT_EQ(stream.unitBytes, i ? units[i] : 0);
+        unsigned covered = 0;
+        for (const unsigned count : stream.units) covered += count;
+        EXPECT_EQ(covered, stream.length);
+    }
+    EXPECT_EQ(avi.totalFrames, 40u);
+    EXPECT_EQ(avi.microseconds, 33367u);
+    EXPECT_EQ(avi.width, 32u);
+
+    // The old index covers the first segment, and nothing else.
+    ASSERT_FALSE(avi.oldIndex.empty());
+    unsigned first = 0;
+    for (size_t i = 0; i < avi.oldIndex.size(); ++i) {
+        EXPECT_EQ(avi.oldIndex[i].id, avi.inOrder[i].id);
+        EXPECT_EQ(avi.oldIndex[i].data, avi.inOrder[i].data);
+        EXPECT_EQ(avi.oldIndex[i].bytes, avi.inOrder[i].bytes);
+        first += avi.oldIndex[i].id == "00db";
+    }
+    EXPECT_EQ(first, avi.firstFrames);
+    EXPECT_EQ(first, avi.streams[0].units[0]);
+
+    // Each picture comes before the sound that follows it in time, and behind all sound before it.
+    double shown = 0, heard = 0;
+    for (const auto& chunk : avi.inOrder) {
+        if (chunk.id == "02wb") heard += static_cast<double>(chunk.bytes) / 4 / 48000;
+        if (chunk.id != "00db") continue;
+        EXPECT_NEAR(heard, shown, 0.001);
+        shown += 1001.0 / 30000;
+    }
+}
+
+TEST_F(RawAvi, SoundFormats) {
+    for (const auto& [channels, bits, tag] :
+         {std::tuple{1, 8, 1}, {2, 16, 1}, {2, 24, 0xFFFE}, {6, 16, 0xFFFE}, {1, 20, 0xFFFE}}) {
+        SCOPED_TRACE(testing::Message() << channels << " channels, " << bits << " bits");
+        pipe_->clearStreams();
+        audio(channels, bits, 48000);
+        ASSERT_EQ(pipe_->open(), 0);
+        QvPcm pcm;
+        fillSound(pcm, 100001, channels, (bits + 7) / 8, 48000);
+        ASSERT_EQ(pipe_->writePcm(&pcm, 0), 0);
+        ASSERT_EQ(pipe_->close(), 0);
+        const auto avi = read();
+        ASSERT_EQ(avi.streams.size(), 1u);
+        EXPECT_TRUE(avi.all(0) == soundBytes(pcm));
+        EXPECT_EQ(avi.streams[0].length, 100001u);
+        const std::string& format = avi.streams[0].format;
+        EXPECT_EQ(format.size(), tag == 1 ? 18u : 40u);
+        EXPECT_EQ(static_cast<unsigned char>(format[0]) | static_cast<unsigned char>(format[1]) << 8, tag);
+        EXPECT_EQ(format[12], channels * ((bits + 7) / 8));
+        if (tag != 1) {
+            EXPECT_EQ(format[18], bits);
+        }
+    }
+}
+
+TEST_F(RawAvi, WhatItCanNotHold) {
+    for (const auto& [type, width] : {std::pair{QvFourcc::GRAY, 32}, {QvFourcc::ARGB, 32}}) {
+        pipe_->clearStreams();
+        video(type, width, 32);
+        EXPECT_EQ(pipe_->open(), QvStatus::failed);
+        EXPECT_NE(std::string(pipe_->errorDesc()).find(qvFourccText(type).data()), std::string::npos);
+    }
+    pipe_->clearStreams();
+    pipe_->getMuxer()->setParam("segments", 3);
+    pipe_->getMuxer()->setParam("riffBytes", 20000);
+    video(QvFourcc::BGR4, 64, 64);
+    ASSERT_EQ(pipe_->open(), 0);
+    QvFrame frame = makePicture(QvFourcc::BGR4, 64, 64);
+    int written = 0;
+    while (written < 10 && pipe_->writeFrame(&frame, 0) == 0) ++written;
+    EXPECT_EQ(written, 3);
+    EXPECT_NE(std::string(pipe_->videoEncoder(0)->errorDesc()).find("index is full"), std::string::npos);
+    EXPECT_NE(pipe_->close(), 0);
+
+    pipe_->clearStreams();
+    EXPECT_THROW(pipe_->open(), QvAssertFailure);
+    pipe_->setFilename(Any("/dev/full"));
+    video(QvFourcc::BGR4, 64, 64);
+    int result = pipe_->open();
+    for (int i = 0; i < 1000 && result == 0; ++i) result = pipe_->writeFrame(&frame, 0);
+    EXPECT_NE(result, 0);
+    pipe_->abort();
+}
+
+// Encoders that ask for room and confirm it, in pieces that do not match the pictures; and a worker that
+// writes pictures while sound comes from here.
+TEST_F(RawAvi, OtherWaysOfWriting) {
+    video(QvFourcc::v210, 50, 20);
+    audio(2, 16, 48000);
+    ASSERT_EQ(pipe_->open(), 0);
+    const size_t picture = 128 * 2 * 20;
+    std::string data(3 * picture, 0);
+    for (size_t i = 0; i < data.size(); ++i) data[i] = static_cast<char>(i * 7 + i / 251);
+    auto* out = pipe_->videoStream(0)->bitstream->input();
+    for (size_t at = 0; at < data.size();) {
+        const auto n = static_cast<unsigned>(std::min<size_t>({777, out->usable(out), data.size() - at}));
+        auto* block = out->request(out, n);
+        ASSERT_TRUE(block);
+        std::memcpy(block, &data[at], n);
+        EXPECT_EQ(out->confirm(out, n), n);
+        at += n;
+    }
+    ASSERT_EQ(pipe_->close(), 0);
+    EXPECT_TRUE(read().all(0) == data);
+
+    ASSERT_EQ(pipe_->open(), 0);
+    out = pipe_->videoStream(0)->bitstream->input();
+    EXPECT_EQ(out->copybytes(out, reinterpret_cast<unsigned char*>(data.data()), 100), 100u);
+    EXPECT_NE(pipe_->close(), 0);  // a part of a picture
+
+    pipe_->clearStreams();
+    video(QvFourcc::YUYV, 64, 32);
+    pipe_->videoEncoder(0)->setParam("accelerationOn", 1);
+    audio(2, 16, 48000);
+    ASSERT_EQ(pipe_->open(), 0);
+    std::string pictures, sound;
+    for (unsigned i = 0; i < 100; ++i) {
+        QvFrame frame = makePicture(QvFourcc::YUYV, 64, 32, i);
+        ASSERT_EQ(pipe_->writeFrame(&frame, 0), 0);
+        pictures += pictureBytes(frame);
+        QvPcm pcm;
+        fillSound(pcm, 1920, 2, 2, 48000, i);
+        ASSERT_EQ(pipe_->writePcm(&pcm, 0), 0);
+        sound += soundBytes(pcm);
+    }
+    ASSERT_EQ(pipe_->close(), 0);
+    const auto avi = read();
+    EXPECT_TRUE(avi.all(0) == pictures);
+    EXPECT_TRUE(avi.all(1) == sound);
+}
+
+}  // namespace
