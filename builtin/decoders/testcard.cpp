@@ -86,7 +86,7 @@ class SecondsBar {
     }
 
     void drawCursor(QvFrame& frame) const {
-        if (frame.frameNr < 0) return;
+        if (frame.frameNr < 0 || !(rate_ > 0)) return;
         const int nr = QvTimecode(frame.frameNr, frame.framerate, false).frames();
         const int begin = static_cast<int>(nr * cell_ + left_ + 1.0);
         const int end = static_cast<int>((nr + 1) * cell_ + left_ - 3.0);

@@ -183,7 +183,8 @@ void QvDecodePipe::elementaryStream(int type, int stream, QvElementaryStream* ou
     const Any filesize = getParam("filesize");
     if (filesize.isInt()) out->filesize = filesize.toInt64();
     if (type == qvVideoStream) {
-        out->rate = static_cast<long long>(params.getDouble("vBitrate", 0.0));
+        const double rate = params.getDouble("vBitrate", 0.0);
+        if (rate > 0 && rate < 1e18) out->rate = static_cast<long long>(rate);
         if (params["framerate"].isFramerate()) out->framerate = params["framerate"].asFramerate();
         if (params["videoCodec"].isText()) out->videoCodec = params["videoCodec"];
     } else {

@@ -100,14 +100,14 @@ bool QvDecoderStateManager::_stateStored(const Any& file, AnyDict* out) {
 
 // --- Storing.
 
-// Under a name that leaves no room for the prefix the value would not be found again.
+// Under a name that leaves no room for the prefix the value would not be found again, and some names are none
+// of a file: such a value stays in the document.
 bool QvDecoderStateManager::_shouldBeStoredAsBlob(const char* name, const Any& value) const {
-    return value.isGeneric() && value.size() > largestInline &&
+    return value.isGeneric() && value.size() > largestInline && isPlainName(name) &&
            std::strlen(name) + blobPrefix.size() <= AnyDict::maxKeyLength;
 }
 
 int QvDecoderStateManager::_storeBlob(const Any& file, const char* key, const Any& value, AnyDict& out) {
-    if (!isPlainName(key)) return QvStatus::failed;
     const auto* bytes = static_cast<const unsigned char*>(value.asGeneric());
     const int result = QvFile::compress(blobFile(_fileStateDir(file), key), bytes, value.size());
     if (result == QvStatus::ok) out.set((std::string(blobPrefix) + key).c_str(), Any(""));

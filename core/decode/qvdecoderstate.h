@@ -4,7 +4,8 @@
 //     FOLDER/NAME/                              the manager's path
 //         0123456789abcdef0123456789abcdef/     MD5 of the file's name, lower case
 //             state.xml                         root "decoderState", version "2.0"
-//             KEY.dat                           gzip, one for each block of more than 128 bytes
+//             KEY.dat                           gzip, one for each block of more than 128 bytes whose key
+//                                               can be the name of a file
 //
 // A kept state is void as soon as the file's modification time differs, and whatever is inconsistent counts
 // as not stored: its folder is removed. Nothing locks; two managers on one folder are not guarded against

@@ -67,8 +67,8 @@ class QV_API AnyVector {
     void removeMany(const AnyVector& indices);  // positions before the call, in any order
     Any popBack();                              // invalid on an empty vector
     void clear();
-    void resize(int count);  // new elements are invalid; a negative count is an assertion
-    void swap(AnyVector& other);
+    void resize(int count);       // new elements are invalid; a negative count is an assertion
+    void swap(AnyVector& other);  // an assertion if `other` is the null sentinel
 
     // The first index behind `after` whose element is ==, or -1. Pass a result to continue.
     int indexOf(const Any& value, int after = -1) const;
@@ -185,7 +185,7 @@ class QV_API AnyDict {
     void remove(const char* key);
     void clear();
     void update(const AnyDict& other);  // sets every entry of `other` here; nested containers are replaced
-    void swap(AnyDict& other);
+    void swap(AnyDict& other);          // an assertion if `other` is the null sentinel
 
     // The value if its type is exactly the one named, else the default.
     int getInt32(const char* key, int otherwise = 0) const;

@@ -199,6 +199,7 @@ void AnyDict::update(const AnyDict& other) {
 }
 
 void AnyDict::swap(AnyDict& other) {
+    QV_ASSERT(!other.isNull());
     if (isNull()) {
         other.writable();  // so that the sentinel keeps one to be told by
         delete std::exchange(impl_, new Impl);

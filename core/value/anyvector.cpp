@@ -160,6 +160,7 @@ void AnyVector::resize(int count) {
 }
 
 void AnyVector::swap(AnyVector& other) {
+    QV_ASSERT(!other.isNull());
     if (isNull()) {
         other.writable();  // so that the sentinel keeps one to be told by
         delete std::exchange(impl_, new Impl);

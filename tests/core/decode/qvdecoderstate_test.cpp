@@ -129,8 +129,8 @@ TEST_F(DecoderState, NamesOfKeysNeverBecomePaths) {
         EXPECT_NE(entry.path().filename(), "out.dat");
     QvDecoderState again;
     ASSERT_EQ(manager.restoreState(file, again), 0);
-    EXPECT_EQ(again.size(), 1);
-    EXPECT_TRUE(again["a_name_that_leaves_no_room_for_a_prefix"] == block(300)) << "stays in the document";
+    EXPECT_TRUE(again["../../out"] == block(500)) << "stays in the document";
+    EXPECT_TRUE(again["a_name_that_leaves_no_room_for_a_prefix"] == block(300));
 }
 
 TEST_F(DecoderState, WhatCanNotBeWrittenLeavesNothing) {

@@ -171,6 +171,7 @@ TEST(AnyVector, nullSentinelIsNeverWritten) {
     EXPECT_TRUE(AnyVector::null().isNull() && !stolen.isNull());
 
     AnyVector a(1, 2), b;
+    EXPECT_EQ(failureOf([&] { a.swap(null); }), "");
     a.swap(b);
     EXPECT_TRUE(a.empty());
     EXPECT_EQ(b, AnyVector(1, 2));
