@@ -146,6 +146,9 @@ Filter filterOf(unsigned flags) {
 
 Matrix matrixOf(unsigned flags, unsigned bit709) { return flags & bit709 ? Matrix::bt709 : Matrix::bt601; }
 
+// Without a line of each plane in each field a picture counts as progressive.
+bool hasFields(const Picture& picture) { return picture.height / picture.format->down() > 1; }
+
 struct BandRange {
     int field, first, last;
 };
@@ -209,7 +212,7 @@ bool scale(unsigned mode, Side from, Side to, unsigned flags, const int* rectang
     if (!placePlanes(source, givenFrom) || !placePlanes(target, givenTo)) return false;
 
     Request request;
-    request.interlaced = (flags & QvScale::interlaced) && source.height > 1 && target.height > 1;
+    request.interlaced = (flags & QvScale::interlaced) && hasFields(source) && hasFields(target);
     if (flags & QvScale::clip) {
         mode &= ~QvScale::cropSource;
         source.width = target.width = std::min(source.width, target.width);

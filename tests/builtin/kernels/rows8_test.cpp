@@ -1,0 +1,233 @@
+// Every vector unit of the machine gives the bytes of the plain loops, and touches nothing else.
+#include "builtin/kernels/rows8.h"
+
+#include <gtest/gtest.h>
+
+#include <cmath>
+#include <memory>
+#include <string>
+
+#include "tests/builtin/kernels/guarded.h"
+#include "tests/builtin/kernels/targets.h"
+
+using namespace srk;
+
+namespace {
+
+// Bytes of a line for n pixels: n * times / per, rounded down.
+struct Size {
+    size_t times = 0, per = 1;
+    size_t of(size_t n) const { return n / per * times; }
+};
+constexpr Size none{}, one{1}, half{1, 2}, twoBytes{2}, three{3}, four{4};
+
+struct Lines {
+    Byte* in[4];
+    Byte* out[4];
+    size_t n;
+    const uint16_t* words(int i) const { return reinterpret_cast<const uint16_t*>(in[i]); }
+};
+
+struct Kernel {
+    const char* name;
+    Size in[4], out[4];
+    void (*run)(const Lines&);
+    bool inPlace = false;  // the first output may be the first input
+};
+
+constexpr Matrix b601 = Matrix::bt601, b709 = Matrix::bt709;
+
+const Kernel kernels[] = {
+    {"split4",
+     {four},
+     {one, one, one, one},
+     [](const Lines& l) { split4(l.in[0], l.out[0], l.out[1], l.out[2], l.out[3], l.n); }},
+    {"split4 of three",
+     {four},
+     {one, one, one},
+     [](const Lines& l) { split4(l.in[0], l.out[0], l.out[1], l.out[2], nullptr, l.n); }},
+    {"join4",
+     {one, one, one, one},
+     {four},
+     [](const Lines& l) { join4(l.out[0], l.in[0], l.in[1], l.in[2], l.in[3], l.n); }},
+    {"join4 opaque",
+     {one, one, one},
+     {four},
+     [](const Lines& l) { join4(l.out[0], l.in[0], l.in[1], l.in[2], nullptr, l.n); }},
+    {"split3",
+     {three},
+     {one, one, one},
+     [](const Lines& l) { split3(l.in[0], l.out[0], l.out[1], l.out[2], l.n); }},
+    {"join3",
+     {one, one, one},
+     {three},
+     [](const Lines& l) { join3(l.out[0], l.in[0], l.in[1], l.in[2], l.n); }},
+    {"pack4to3", {four}, {three}, [](const Lines& l) { pack4to3(l.out[0], l.in[0], l.n); }},
+    {"pack3to4", {three}, {four}, [](const Lines& l) { pack3to4(l.out[0], l.in[0], l.n); }},
+    {"reverse4", {four}, {four}, [](const Lines& l) { reverse4(l.out[0], l.in[0], l.n); }, true},
+    {"split YUYV",
+     {twoBytes},
+     {one, half, half},
+     [](const Lines& l) { splitYuyv(l.in[0], l.out[0], l.out[1], l.out[2], l.n, true); }},
+    {"split UYVY",
+     {twoBytes},
+     {one, half, half},
+     [](const Lines& l) { splitYuyv(l.in[0], l.out[0], l.out[1], l.out[2], l.n, false); }},
+    {"join YUYV",
+     {one, half, half},
+     {twoBytes},
+     [](const Lines& l) { joinYuyv(l.out[0], l.in[0], l.in[1], l.in[2], l.n, true); }},
+    {"join UYVY",
+     {one, half, half},
+     {twoBytes},
+     [](const Lines& l) { joinYuyv(l.out[0], l.in[0], l.in[1], l.in[2], l.n, false); }},
+    {"rgb4ToYuv",
+     {four},
+     {one, one, one},
+     [](const Lines& l) { rgb4ToYuv(toYuv(b601, false), l.in[0], l.out[0], l.out[1], l.out[2], l.n); }},
+    {"rgb4ToYuv video",
+     {four},
+     {one, one, one},
+     [](const Lines& l) { rgb4ToYuv(toYuv(b709, true), l.in[0], l.out[0], l.out[1], l.out[2], l.n); }},
+    {"rgbToYuv",
+     {one, one, one},
+     {one, one, one},
+     [](const Lines& l) {
+         rgbToYuv(toYuv(b709, false), l.in[0], l.in[1], l.in[2], l.out[0], l.out[1], l.out[2], l.n);
+     },
+     true},
+    {"yuvToRgb",
+     {one, one, one},
+     {one, one, one},
+     [](const Lines& l) {
+         yuvToRgb(toRgb(b601, false), l.in[0], l.in[1], l.in[2], l.out[0], l.out[1], l.out[2], l.n);
+     },
+     true},
+    {"yuvToRgb4",
+     {one, one, one},
+     {four},
+     [](const Lines& l) { yuvToRgb4(toRgb(b709, false), l.in[0], l.in[1], l.in[2], l.out[0], l.n); }},
+    {"yuvToRgb3 video",
+     {one, one, one},
+     {three},
+     [](const Lines& l) { yuvToRgb3(toRgb(b709, true), l.in[0], l.in[1], l.in[2], l.out[0], l.n); }},
+    {"yuvToOther",
+     {one, one, one},
+     {one, one, one},
+     [](const Lines& l) {
+         for (int i = 0; i < 3; ++i) std::memmove(l.out[i], l.in[i], l.n);
+         yuvToOther(toOther(b709), l.out[0], l.out[1], l.out[2], l.n);
+     }},
+    {"toVideoLevels", {one}, {one}, [](const Lines& l) { toVideoLevels(l.out[0], l.in[0], l.n); }, true},
+    {"toFullLevels", {one}, {one}, [](const Lines& l) { toFullLevels(l.out[0], l.in[0], l.n); }, true},
+    {"widen",
+     {one},
+     {twoBytes},
+     [](const Lines& l) { widen(reinterpret_cast<uint16_t*>(l.out[0]), l.in[0], l.n, false); }},
+    {"widen full",
+     {one},
+     {twoBytes},
+     [](const Lines& l) { widen(reinterpret_cast<uint16_t*>(l.out[0]), l.in[0], l.n, true); }},
+    {"narrow", {twoBytes}, {one}, [](const Lines& l) { narrow(l.out[0], l.words(0), l.n, false); }},
+    {"narrow full", {twoBytes}, {one}, [](const Lines& l) { narrow(l.out[0], l.words(0), l.n, true); }},
+    {"twice", {one}, {twoBytes}, [](const Lines& l) { twice(l.out[0], l.in[0], l.n); }},
+    {"doubleLine", {half}, {one}, [](const Lines& l) { doubleLine(l.out[0], l.in[0], l.n); }},
+    {"quarterWay",
+     {one, one},
+     {one},
+     [](const Lines& l) { quarterWay(l.out[0], l.in[0], l.in[1], l.n); },
+     true},
+    {"halfWay", {one, one}, {one}, [](const Lines& l) { halfWay(l.out[0], l.in[0], l.in[1], l.n); }, true},
+};
+
+constexpr size_t longest = 129;
+
+std::string bytesOf(Byte* from, size_t n) { return {reinterpret_cast<const char*>(from), n}; }
+
+// What a kernel makes of lines that end at the edge of their memory, on one unit.
+std::string run(const Kernel& kernel, size_t n, bool inPlace, int64_t target) {
+    std::unique_ptr<Guarded> in[4], out[4];
+    Lines lines{{}, {}, n};
+    for (unsigned i = 0; i < 4; ++i) {
+        in[i] = std::make_unique<Guarded>(kernel.in[i].of(n), i + static_cast<unsigned>(n));
+        out[i] = std::make_unique<Guarded>(kernel.out[i].of(n), 77 + i);
+        lines.in[i] = in[i]->data();
+        lines.out[i] = inPlace ? in[i]->data() : out[i]->data();
+    }
+    const OnTarget only(target);
+    kernel.run(lines);
+    std::string result;
+    for (int i = 0; i < 4; ++i) {
+        result += bytesOf(lines.out[i], kernel.out[i].of(n));
+        if (!inPlace) result += bytesOf(lines.in[i], kernel.in[i].of(n));
+        if (!in[i]->frontIntact() || !out[i]->frontIntact()) result += "written before the line";
+    }
+    return result;
+}
+
+}  // namespace
+
+TEST(Rows8, UnitsGiveTheBytesOfThePlainLoops) {
+    const auto targets = machineTargets();
+    for (const auto& kernel : kernels)
+        for (size_t n = 1; n <= longest; ++n)
+            for (const bool inPlace : {false, true}) {
+                if (inPlace && !kernel.inPlace) continue;
+                const std::string expected = run(kernel, n, inPlace, HWY_SCALAR);
+                EXPECT_EQ(expected.find("written before"), std::string::npos);
+                for (const auto target : targets)
+                    ASSERT_TRUE(run(kernel, n, inPlace, target) == expected)
+                        << kernel.name << ' ' << n << (inPlace ? " in place on " : " on ")
+                        << hwy::TargetName(target);
+            }
+}
+
+TEST(Rows8, UnitsOfTheMachineReallyRun) {
+    for (const auto target : machineTargets()) {
+        const OnTarget only(target);
+        EXPECT_STREQ(rows8Unit(), hwy::TargetName(target));
+    }
+}
+
+TEST(Rows8, MatricesStayNearTheExactFormula) {
+    // Full levels to BT.601, with the weights of the standard.
+    double worst = 0;
+    for (int r = 0; r < 256; r += 3)
+        for (int g = 0; g < 256; g += 5)
+            for (int b = 0; b < 256; b += 3) {
+                const Byte pixel[4] = {static_cast<Byte>(b), static_cast<Byte>(g), static_cast<Byte>(r), 0};
+                Byte y, u, v;
+                rgb4ToYuv(toYuv(b601, false), pixel, &y, &u, &v, 1);
+                const double luma = 0.299 * r + 0.587 * g + 0.114 * b;
+                const double expected[3] = {16 + luma * 219 / 255, 128 + (b - luma) / 1.772 * 224 / 255,
+                                            128 + (r - luma) / 1.402 * 224 / 255};
+                worst = std::max(
+                    {worst, std::abs(y - expected[0]), std::abs(u - expected[1]), std::abs(v - expected[2])});
+                Byte back[4];
+                yuvToRgb4(toRgb(b601, false), &y, &u, &v, back, 1);
+                const double exact = (19077.0 * (y - 16) + 26153.0 * (v - 128)) / 16384;
+                ASSERT_LE(std::abs(back[2] - std::clamp(exact, 0.0, 255.0)), 0.6);
+                for (int i = 0; i < 3; ++i)
+                    ASSERT_LE(std::abs(back[i] - pixel[i]), 2) << r << ' ' << g << ' ' << b;
+            }
+    EXPECT_LE(worst, 0.62);
+}
+
+TEST(Rows8, GreyHasNoColourAndLevelsMeetTheirEnds) {
+    for (const Matrix matrix : {b601, b709})
+        for (const bool video : {false, true})
+            for (int grey = video ? 16 : 0; grey <= (video ? 235 : 255); ++grey) {
+                const Byte pixel[4] = {static_cast<Byte>(grey), static_cast<Byte>(grey),
+                                       static_cast<Byte>(grey), 9};
+                Byte y, u, v, back[4];
+                rgb4ToYuv(toYuv(matrix, video), pixel, &y, &u, &v, 1);
+                ASSERT_EQ(u, 128);
+                ASSERT_EQ(v, 128);
+                yuvToRgb4(toRgb(matrix, video), &y, &u, &v, back, 1);
+                ASSERT_LE(std::abs(back[1] - grey), 1);
+                if (grey == (video ? 235 : 255)) {
+                    EXPECT_EQ(y, 235);
+                    EXPECT_EQ(back[0], grey);
+                }
+            }
+}

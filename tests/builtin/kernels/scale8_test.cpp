@@ -1,0 +1,131 @@
+// The filters, and both passes of scaling on every vector unit.
+#include "builtin/kernels/scale8.h"
+
+#include <gtest/gtest.h>
+
+#include <cmath>
+#include <numeric>
+
+#include "tests/builtin/kernels/guarded.h"
+#include "tests/builtin/kernels/targets.h"
+
+using namespace srk;
+
+namespace {
+
+Mapping centred(int source, int target) {
+    const double step = static_cast<double>(source) / target;
+    return {(step - 1) / 2, step};
+}
+
+constexpr Filter filters[] = {Filter::nearest, Filter::linear, Filter::cubic, Filter::sinc};
+
+// Ratios that use each form of the pass across, in both directions, mirrored, and with positions outside.
+struct Geometry {
+    int source, target;
+    Mapping mapping;
+};
+const Geometry geometries[] = {
+    {1, 5, centred(1, 5)},         {2, 7, centred(2, 7)},       {100, 67, centred(100, 67)},
+    {64, 129, centred(64, 129)},   {129, 43, centred(129, 43)}, {1920, 31, centred(1920, 31)},
+    {65, 65, {0.25, 1}},           {65, 65, {64, -1}},          {50, 40, {-20, 3}},
+    {300, 200, centred(300, 200)}, {90, 45, centred(90, 45)},   {33, 33, {0, 1}},
+};
+
+std::vector<int16_t> across(const Across& table, Guarded& line, int64_t target) {
+    std::vector<Byte> padded(static_cast<size_t>(beforeLine + table.source + behindLine));
+    padLine(padded.data() + beforeLine, line.data(), table.source);
+    std::vector<int16_t> words(static_cast<size_t>(table.target + wordBlock), 77);
+    const OnTarget only(target);
+    // A copy reads the line itself.
+    scaleAcross(table, table.form == Across::copy ? line.data() : padded.data() + beforeLine, words.data());
+    words.resize(static_cast<size_t>(table.target));
+    return words;
+}
+
+}  // namespace
+
+TEST(Axis, WeightsAddUpAndTheDesignedRowsAreMet) {
+    for (const auto filter : filters)
+        for (const auto& geometry : geometries) {
+            const Axis axis = makeAxis(geometry.mapping, geometry.source, geometry.target, filter, false);
+            for (int i = 0; i < axis.target && !axis.copies; ++i)
+                ASSERT_EQ(std::accumulate(axis.weights.begin() + i * axis.taps,
+                                          axis.weights.begin() + (i + 1) * axis.taps, 0),
+                          unity);
+        }
+    const auto half = sincPhases(0.5);
+    const double expected[8] = {-4, 0, 36, 64, 36, 0, -4, 0};
+    for (unsigned i = 0; i < 8; ++i) EXPECT_NEAR(half[0][i], expected[i], 0.01);
+    const auto full = sincPhases(2);
+    EXPECT_NEAR(full[0][3], 128, 0.01);
+    EXPECT_NEAR(full[2][3], 114.3066, 0.01);
+    EXPECT_NEAR(full[4][3], 78.9584, 0.01);
+    EXPECT_NEAR(full[8][4], 128, 0.01);
+    const auto least = sincPhases(0.01);
+    for (const double tap : least[4]) EXPECT_NEAR(tap, 16, 0.5);
+    for (double ratio = 0.03; ratio < 1.2; ratio += 0.01)
+        for (const auto& phase : sincPhases(ratio))
+            EXPECT_NEAR(std::accumulate(phase.begin(), phase.end(), 0.0), 128, 1e-9);
+}
+
+TEST(Scale8, UnitsGiveTheBytesOfThePlainLoops) {
+    for (const auto& geometry : geometries) {
+        Guarded line(static_cast<size_t>(geometry.source), 5);
+        for (const auto filter : filters) {
+            const Axis axis = makeAxis(geometry.mapping, geometry.source, geometry.target, filter, false);
+            const Across table = makeAcross(axis);
+            const auto expected = across(table, line, HWY_SCALAR);
+            for (int i = 0; i < axis.target && !axis.copies; ++i) {
+                int sum = -16384;
+                for (int t = 0; t < axis.taps; ++t)
+                    sum +=
+                        axis.weights[static_cast<size_t>(i * axis.taps + t)] *
+                        line.data()[std::clamp(axis.start[static_cast<size_t>(i)] + t, 0, axis.source - 1)];
+                ASSERT_EQ(expected[static_cast<size_t>(i)], sum)
+                    << geometry.source << " to " << geometry.target << " form " << table.form;
+            }
+            for (const auto target : machineTargets())
+                ASSERT_EQ(across(table, line, target), expected)
+                    << geometry.source << " to " << geometry.target << " on " << hwy::TargetName(target)
+                    << " form " << table.form;
+        }
+    }
+}
+
+TEST(Scale8, LinesAreAddedUpAlike) {
+    for (const int taps : {1, 2, 4, 6, 8, 20})
+        for (int n = 1; n <= 70; ++n) {
+            std::vector<std::vector<int16_t>> lines;
+            std::vector<const int16_t*> starts;
+            std::vector<int16_t> weights(static_cast<size_t>(taps), 0);
+            for (int t = 0; t < taps; ++t) {
+                Guarded bytes(static_cast<size_t>(n), static_cast<unsigned>(t));
+                auto& words = lines.emplace_back(static_cast<size_t>(n + wordBlock));
+                for (int i = 0; i < n; ++i)
+                    words[static_cast<size_t>(i)] = static_cast<int16_t>(bytes.data()[i] * 170 - 16384);
+            }
+            for (const auto& line : lines) starts.push_back(line.data());
+            int left = unity;
+            for (int t = 0; t + 1 < taps; ++t)
+                left -= weights[static_cast<size_t>(t)] = static_cast<int16_t>(t % 3 ? 40 / taps : -15);
+            weights.back() = static_cast<int16_t>(left);
+            std::string expected;
+            for (const auto target : machineTargets()) {
+                Guarded to(static_cast<size_t>(n), 9);
+                const OnTarget only(target);
+                scaleDown(starts.data(), weights.data(), taps, to.data(), n);
+                const std::string bytes(reinterpret_cast<char*>(to.data()), to.size());
+                if (expected.empty()) expected = bytes;
+                ASSERT_EQ(bytes, expected) << taps << " taps, " << n << " on " << hwy::TargetName(target);
+                EXPECT_TRUE(to.frontIntact());
+            }
+        }
+}
+
+TEST(Scale8, UnitsOfTheMachineReallyRun) {
+    for (const auto target : machineTargets()) {
+        const OnTarget only(target);
+        EXPECT_STREQ(scale8Unit(), hwy::TargetName(target));
+    }
+}

@@ -1,0 +1,29 @@
+// Runs kernels on one vector unit after the other.
+#pragma once
+
+#include <hwy/highway.h>
+
+#include <vector>
+
+// While it lives, kernels run on this unit alone.
+class OnTarget {
+  public:
+    explicit OnTarget(int64_t target) { choose(target); }
+    ~OnTarget() { choose(0); }
+    OnTarget(const OnTarget&) = delete;
+    OnTarget& operator=(const OnTarget&) = delete;
+
+  private:
+    static void choose(int64_t target) {
+        hwy::SetSupportedTargetsForTest(target);
+        hwy::GetChosenTarget().Update(hwy::SupportedTargets());
+    }
+};
+
+// The units that this machine has and the kernels are compiled for, plain loops among them.
+inline std::vector<int64_t> machineTargets() {
+    std::vector<int64_t> targets;
+    for (const int64_t target : {HWY_SCALAR, HWY_SSE4, HWY_AVX2, HWY_AVX3})
+        if (target == HWY_SCALAR || (hwy::SupportedTargets() & target)) targets.push_back(target);
+    return targets;
+}
