@@ -3,8 +3,8 @@
 #include "core/caption/drawntexts_p.h"
 
 bool DrawnText::is(const DrawnTextKey& key) const {
-    return encoding == key.encoding && rgb == key.rgb && fourcc == key.fourcc && text == key.text &&
-           fieldMasks == key.fieldMasks;
+    return encoding == key.encoding && rgb == key.rgb && fourcc == key.fourcc && matrix == key.matrix &&
+           text == key.text && fieldMasks == key.fieldMasks;
 }
 
 DrawnText* DrawnTexts::find(const DrawnTextKey& key) {
@@ -24,6 +24,7 @@ DrawnText& DrawnTexts::renew(const DrawnTextKey& key) {
     text.fieldMasks = key.fieldMasks;
     text.rgb = key.rgb;
     text.fourcc = key.fourcc;
+    text.matrix = key.matrix;
     for (DrawnLine& line : text.lines) line.drawn = QvRect();
     return text;
 }

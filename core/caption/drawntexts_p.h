@@ -28,6 +28,7 @@ struct DrawnTextKey {
     const AnyVector& fieldMasks;
     unsigned rgb;  // 0xRRGGBB
     unsigned fourcc;
+    QvYUVMatrix matrix;
 };
 
 struct DrawnText {
@@ -36,6 +37,7 @@ struct DrawnText {
     AnyVector fieldMasks;
     unsigned rgb = 0;
     unsigned fourcc = 0;
+    QvYUVMatrix matrix = qvMatrixNotSet;
     std::deque<DrawnLine> lines;
 
     bool is(const DrawnTextKey& key) const;

@@ -4,13 +4,13 @@
 #include <string>
 #include <string_view>
 
-#include "core/caption/bandconverter_p.h"
 #include "core/caption/drawntexts_p.h"
 #include "core/caption/qvsubtitles.h"
 #include "core/caption/qvtext.h"
 #include "core/caption/qvtextrenderingoptions.h"
 #include "core/caption/textmask_p.h"
 #include "core/engine/status.h"
+#include "core/filter/qvcolorconvert.h"
 #include "core/media/qvdraw.h"
 #include "core/value/qvassert.h"
 
@@ -25,6 +25,12 @@ constexpr int widthStep = 32;        // so that a running timecode keeps its pic
 
 unsigned rgbOf(const QvColor* color) {
     return color && !color->isYuv ? color->bgr32(false) & 0xFFFFFF : 0xFFFFFF;
+}
+
+// A band is too low to tell the matrix of the picture that it is made for.
+QvYUVMatrix matrixOf(const QvFrame& frame) {
+    if (frame.YUVMatrix() != qvMatrixNotSet) return frame.YUVMatrix();
+    return frame.height() < 720 ? qvMatrixBT601 : qvMatrixBT709;
 }
 
 std::string_view bytesOf(const Any& text) {
@@ -98,8 +104,10 @@ struct QvSubtitleRender::Private {
     int effect;
     DrawnTexts texts;
     QvFrame band;  // BGR4, on its way to another format or into an effect
-    BandConverter converter;
-    QvFrame letters;  // GRAY, on its way into an effect
+    std::unique_ptr<QvColorConverter> converter;
+    unsigned converterFourcc = 0;
+    bool converterHd = false;  // to BT.709
+    QvFrame letters;           // GRAY, on its way into an effect
 
     explicit Private(const Options& options)
         : encoding(encodingOf(options)),
@@ -187,7 +195,16 @@ struct QvSubtitleRender::Private {
         drawLetters(drawn.line, size, text.fieldMasks, area, drawn.mask);
         fill(colours, text.rgb);
         if (effect != Options::noEffect) applyEffect(text.rgb, colours, drawn.mask);
-        return direct || converter.convert(band, text.fourcc, drawn.colours);
+        return direct || convert(text, drawn.colours);
+    }
+
+    bool convert(const DrawnText& text, QvFrame& out) {
+        const bool hd = text.matrix == qvMatrixBT709;
+        if (!converter || converterFourcc != text.fourcc || converterHd != hd)
+            converter = std::make_unique<QvColorConverter>(text.fourcc, !hd, hd);
+        converterFourcc = text.fourcc;
+        converterHd = hd;
+        return converter->convert(band, out) == QvStatus::ok;
     }
 
     // Letters of the colour on black, which the mask then shows around them.
@@ -216,8 +233,12 @@ int QvSubtitleRender::render(QvFrame& frame, const QvSubtitle& subtitle, const Q
     if (!p_ || !p_->library.get()) return QvStatus::ok;
     const bool wide = subtitle.text.isWString();
     const Any text = wide ? subtitle.text.toString() : Any();
-    const DrawnTextKey key{bytesOf(wide ? text : subtitle.text), wide ? QvText::utf8 : p_->encoding,
-                           subtitle.fieldMasks, rgbOf(color), frame.four_cc()};
+    const DrawnTextKey key{bytesOf(wide ? text : subtitle.text),
+                           wide ? QvText::utf8 : p_->encoding,
+                           subtitle.fieldMasks,
+                           rgbOf(color),
+                           frame.four_cc(),
+                           matrixOf(frame)};
     DrawnText& drawn = p_->textOf(key);
     int offset = 0;
     for (DrawnLine& line : drawn.lines) {

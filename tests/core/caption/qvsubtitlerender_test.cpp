@@ -12,8 +12,7 @@
 #include "core/caption/qvsubtitles.h"
 #include "core/caption/qvtextrenderingoptions.h"
 #include "core/engine/init.h"
-#include "core/engine/qvcodec.h"
-#include "core/engine/qvregistry.h"
+#include "core/filter/qvcolorconvert.h"
 #include "core/media/qvbuffer.h"
 #include "core/media/qvdraw.h"
 #include "tests/support/log_capture.h"
@@ -289,8 +288,6 @@ QvPoint changedRows(const QvFrame& a, const QvFrame& b) {
 
 TEST_F(Render, EveryFormatHasTheTextInItsPlace) {
     init_wrapper(nullptr);
-    if (!std::unique_ptr<QvCodec>(qv_registry()->newCodec("scaler")))
-        GTEST_SKIP() << "this build can't convert";
     draw("H", 1, {100, 20});
     const QvRect ink = inked(0, 241);
     QvSubtitle subtitle;
@@ -308,6 +305,35 @@ TEST_F(Render, EveryFormatHasTheTextInItsPlace) {
         const QvPoint rows = changedRows(before, target);
         EXPECT_NEAR(rows.x(), ink.top(), 1) << target.str_four_cc();
         EXPECT_NEAR(rows.y(), ink.bottom() - 1, 1) << target.str_four_cc();
+    }
+    cleanup_wrapper();
+}
+
+// The letter's inside has exactly the colour that a whole picture of it would have.
+TEST_F(Render, ColoursSuitThePicturesMatrix) {
+    init_wrapper(nullptr);
+    const QvColor orange(255, 128, 0, false);
+    options.charSize = 200;
+    QvSubtitle subtitle;
+    subtitle.text = "H";
+    subtitle.position = QvPoint(100, 20);
+    QvSubtitleRender render;
+    render.init(options);
+    for (const int height : {480, 1080}) {
+        clear(640, height);
+        frame.setRGB(255, 128, 0);
+        QvFrame whole, target;
+        QvColorConverter(QvFourcc::I420, false, false).convert(frame, whole);
+        target.init(QvFourcc::I420, 640, height);
+        target.setBlack();
+        render.render(target, subtitle, &orange);
+        for (int plane = 0; plane < 3; ++plane) {
+            int found = 0;
+            for (int y = 0; y < target.height(plane); ++y)
+                for (int x = 0; x < target.width(plane); ++x)
+                    found += *target.pixelPtr(x, y, plane) == *whole.pixelPtr(0, 0, plane);
+            EXPECT_GT(found, 500) << "plane " << plane << " of " << height;
+        }
     }
     cleanup_wrapper();
 }
