@@ -8,6 +8,7 @@
 #include <nlohmann/json.hpp>
 
 #include "commands.h"
+#include "console.h"
 #include "failure.h"
 #include "source.h"
 
@@ -38,7 +39,7 @@ void printLine(std::span<const QvCcBytePair> pairs, const QvFramerate& rate, boo
     const std::string time = timecodeText(pairs.front().time, rate), bytes = bytesText(pairs),
                       text = qvCcText(pairs, pairs.front().type());
     if (!json) {
-        std::printf("%s\t%d\t%s\t%s\n", time.c_str(), field, bytes.c_str(), text.c_str());
+        print("%s\t%d\t%s\t%s\n", time.c_str(), field, bytes.c_str(), text.c_str());
         return;
     }
     const nlohmann::ordered_json line = {{"time", time},
@@ -46,7 +47,7 @@ void printLine(std::span<const QvCcBytePair> pairs, const QvFramerate& rate, boo
                                          {"field", field},
                                          {"bytes", bytes},
                                          {"text", text}};
-    std::printf("%s\n", line.dump().c_str());
+    print("%s\n", line.dump().c_str());
 }
 
 // The pairs of one frame, a line for each field.

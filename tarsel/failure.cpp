@@ -2,24 +2,24 @@
 
 #include <algorithm>
 #include <cstdio>
-#include <numeric>
 
 namespace {
 
-// Levenshtein distance, ignoring nothing: names are short.
+// How many letters are missing, too many, wrong, or, as a pair, the wrong way round.
 size_t distance(std::string_view a, std::string_view b) {
-    std::vector<size_t> row(b.size() + 1);
-    std::iota(row.begin(), row.end(), size_t{0});
-    for (size_t i = 1; i <= a.size(); ++i) {
-        size_t diagonal = row[0];
-        row[0] = i;
-        for (size_t j = 1; j <= b.size(); ++j) {
-            const size_t above = row[j];
-            row[j] = std::min({above + 1, row[j - 1] + 1, diagonal + (a[i - 1] != b[j - 1])});
-            diagonal = above;
+    std::vector<std::vector<size_t>> d(a.size() + 1, std::vector<size_t>(b.size() + 1));
+    for (size_t i = 0; i <= a.size(); ++i)
+        for (size_t j = 0; j <= b.size(); ++j) {
+            if (i == 0 || j == 0) {
+                d[i][j] = i + j;
+                continue;
+            }
+            const size_t wrong = a[i - 1] != b[j - 1];
+            d[i][j] = std::min({d[i - 1][j] + 1, d[i][j - 1] + 1, d[i - 1][j - 1] + wrong});
+            if (i > 1 && j > 1 && a[i - 1] == b[j - 2] && a[i - 2] == b[j - 1])
+                d[i][j] = std::min(d[i][j], d[i - 2][j - 2] + 1);
         }
-    }
-    return row[b.size()];
+    return d[a.size()][b.size()];
 }
 
 }  // namespace

@@ -87,6 +87,10 @@ std::string streamLine(const Json& s) {
         if (s.contains("rate")) add(s["rate"].get<std::string>() + " fps " + s["scan"].get<std::string>());
         if (s.contains("frames")) add(number("frames") + " frames");
         if (s.contains("views") && s["views"] != 1) add(number("views") + " views");
+    } else if (s["type"] == "subpicture") {
+        if (s.contains("timecode")) add(s["timecode"].get<std::string>());
+        if (s.contains("frames")) add(number("frames") + " frames");
+        if (s.contains("pairs")) add(number("pairs") + " pairs");
     } else {
         if (s.contains("samplerate")) add(number("samplerate") + " Hz");
         if (s.contains("channels")) add(number("channels") + " ch");

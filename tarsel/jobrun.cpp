@@ -171,8 +171,8 @@ void Job::stopped(Exit signalled) const {
                                     : "stopped; nothing was left behind");
 }
 
-// The reason stands in the object that failed: a decoder, a link, or one of the output's members. What the
-// user log has is less exact.
+// The reason stands in the object that failed: a decoder, a link, or one of the output's members, where the
+// file knows what the system said. What the user log has is less exact.
 void Job::fail(Runner& runner) const {
     for (const auto& source : sources_)
         if (source->decoder().errorCode() < 0 && source->decoder().errorCode() != QvStatus::endOfStream)
@@ -182,6 +182,9 @@ void Job::fail(Runner& runner) const {
     const auto take = [&](const QvCodec* codec) {
         if (reason.empty() && codec && codec->errorCode() != 0) reason = codec->errorDesc();
     };
+    for (const JobStream& s : streams_)
+        if (const QvBufStream* file = pipe_->getMuxer()->stream(s.type, s.encStream); file && reason.empty())
+            reason = file->ioErrorText();
     for (const JobStream& s : streams_) take(pipe_->encoder(s.type, s.encStream));
     take(pipe_->getMuxer());
     take(pipe_->sink());

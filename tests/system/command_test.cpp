@@ -59,7 +59,7 @@ TEST_F(Command, WrongUseIsTold) {
 
 TEST_F(Command, HelpEverywhere) {
     const Outcome all = tarsel({"--help"});
-    for (const char* name : {"transcode", "info", "frame", "modules", "formats", "presets"}) {
+    for (const char* name : {"transcode", "info", "frame", "captions", "modules", "formats", "presets"}) {
         EXPECT_THAT(all.out, HasSubstr(name));
         const Outcome o = tarsel({name, "--help"});
         EXPECT_EQ(o.status, 0);

@@ -9,6 +9,8 @@ class Signal : public Tool {
   protected:
     // Long enough that only a signal ends it.
     static constexpr const char* kEndless = "testgen:size=64x64,rate=25,duration=20000,audio=0";
+    // The same with frames that no pipe holds: a reader that takes none of it holds the job up for sure.
+    static constexpr const char* kLarge = "testgen:size=1280x720,rate=25,duration=20000,audio=0";
     static std::vector<std::string> endless() {
         return words({"transcode", kEndless, "-o", "out.raw", "--progress", "json"});
     }
@@ -41,11 +43,10 @@ TEST_F(Signal, AnExistingOutputStaysAsItWas) {
     EXPECT_EQ(listing(), std::set<std::string>{"out.raw"});
 }
 
-// A reader that takes nothing holds the job up, so the first signal can't end it.
 TEST_F(Signal, TheSecondEndsAtOnce) {
     mkfifo(folder.file("pipe.raw").c_str(), 0600);
     const int reader = open(folder.file("pipe.raw").c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
-    Process run(words({"transcode", kEndless, "-o", "pipe.raw", "--progress", "json"}), here());
+    Process run(words({"transcode", kLarge, "-o", "pipe.raw", "--progress", "json"}), here());
     ASSERT_TRUE(run.waitFor("\"event\":\"start\""));
     char byte;
     pollfd data{reader, POLLIN, 0};
@@ -62,7 +63,7 @@ TEST_F(Signal, TheSecondEndsAtOnce) {
 TEST_F(Signal, AReaderThatGoesIsAnError) {
     mkfifo(folder.file("pipe.raw").c_str(), 0600);
     const int reader = open(folder.file("pipe.raw").c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
-    Process run(words({"transcode", kEndless, "-o", "pipe.raw", "--progress", "json"}), here());
+    Process run(words({"transcode", kLarge, "-o", "pipe.raw", "--progress", "json"}), here());
     pollfd data{reader, POLLIN, 0};
     ASSERT_EQ(poll(&data, 1, Process::kPatience), 1);
     close(reader);
