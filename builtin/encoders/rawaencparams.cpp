@@ -1,10 +1,8 @@
 // Parameters of the raw audio encoder.
 #include <algorithm>
-#include <climits>
-#include <cstring>
 
 #include "builtin/encoders/rawaenc.h"
-#include "core/engine/params.h"
+#include "builtin/encoders/rawsettings.h"
 #include "core/engine/qvutil.h"
 #include "core/media/qvgeometry.h"
 #include "core/value/qvassert.h"
@@ -42,16 +40,11 @@ struct RawAudioParams {
         }
         return QvStatus::ok;
     }
-    static int settings(Enc& enc, const Any& value) {
-        return value.isDict() ? enc.setParamDict(value.asDict()) : QvStatus::invalidParam;
-    }
 
     static long long bitrate(const Enc& enc) {
         return static_cast<long long>(enc.samplerate_) * enc.channels_ * ((enc.bitsPerSample_ + 7) / 8) * 8;
     }
-    static int bitrateInt(const Enc& enc) {
-        return static_cast<int>(std::min<long long>(bitrate(enc), INT_MAX));
-    }
+    static int bitrateInt(const Enc& enc) { return rawsettings::bitrateInt(bitrate(enc)); }
     static int kilobits(const Enc& enc) { return static_cast<int>(bitrate(enc) / 1024); }
 
     static void samplerateRange(const Enc& enc, Any& value) {
@@ -59,13 +52,6 @@ struct RawAudioParams {
         for (const int rate : samplerates)
             if (!isBroadcast(enc.profile_) || rate == broadcastSamplerate) range.append(rate);
         value = range;
-    }
-    static void bitrateRange(const Enc& enc, Any& value) {
-        AnyDict constant("type", static_cast<int>(QvBitrate::cbr));
-        constant.set("range", AnyVector(bitrateInt(enc)));
-        AnyVector ranges;
-        ranges.append(constant);
-        value = ranges;
     }
     static void channelsRangeDesc(const Enc&, Any& value) {
         AnyVector all;
@@ -95,7 +81,7 @@ std::span<const QvParamRow<RawAudioEnc>> RawAudioParams::rows() {
         {"smartRenderingOn", Access{refuse, zero}},
         {"type", &Enc::type_, qvParamWriteOnly},
         {"profile", Access{profile, nullptr}},
-        {"settings", Access{settings, nullptr}},
+        {"settings", Access{rawsettings::apply<Enc>, nullptr}},
         {"samplerate", &Enc::samplerate_, qvParamStored, 1, 1000000},
         {"channels", &Enc::channels_, qvParamStored, 1, 32},
         {"bitsPerSample", &Enc::bitsPerSample_, qvParamStored, 1, 32},
@@ -106,7 +92,7 @@ std::span<const QvParamRow<RawAudioEnc>> RawAudioParams::rows() {
         {"bitsPerSampleRange", Access{nullptr, [](E, Any& v) { v = AnyVector(16, 24); }}},
         {"samplerateRange", Access{nullptr, samplerateRange}},
         {"aBitrateRange", Access{nullptr, [](E e, Any& v) { v = AnyVector(kilobits(e)); }}},
-        {"bitrateRange", Access{nullptr, bitrateRange}},
+        {"bitrateRange", Access{nullptr, [](E e, Any& v) { v = rawsettings::bitrateRange(bitrateInt(e)); }}},
         {"channelsRange", Access{nullptr, [](E, Any& v) { v = AnyVector(1, 2, 3, 4, 5, 6, 7, 8); }}},
         {"channelsRangeDesc", Access{nullptr, channelsRangeDesc}},
         {"extension", Access{nullptr, [](E, Any& v) { v = "wav"; }}},
@@ -127,20 +113,9 @@ void RawAudioEnc::getParam(const char* name, Any& value) const {
     if (!qvGetParamRow(RawAudioParams::rows(), *this, name, value)) QvAudioEncoder::getParam(name, value);
 }
 
-void RawAudioEnc::store(AnyDict& state) const {
-    state.clear();
-    state.set("name", name());
-    AnyDict settings;
-    qvStoreParamRows(RawAudioParams::rows(), *this, settings);
-    state.set("settingsDict", settings);
-}
+void RawAudioEnc::store(AnyDict& state) const { state = rawsettings::stored(RawAudioParams::rows(), *this); }
 
-// The older form has the settings beside the name, or in "settings".
 int RawAudioEnc::restore(const AnyDict& state) {
-    if (!(state.get("name") == Any(name()))) return setError(QvStatus::failed, "restore - invalid name");
-    const auto& current = state.get("settingsDict");
-    if (current.isDict()) return qvRestoreParamRows(RawAudioParams::rows(), *this, current.asDict());
-    int result = 0;
-    if (state.get("settings").isDict()) result |= setParamDict(state.get("settings").asDict());
-    return result | qvRestoreParamRows(RawAudioParams::rows(), *this, state);
+    if (state.get("name") != name()) return setError(QvStatus::failed, "restore - invalid name");
+    return rawsettings::restore(RawAudioParams::rows(), *this, state);
 }

@@ -1,11 +1,9 @@
 // Parameters of the raw video encoder.
-#include <algorithm>
-#include <climits>
 #include <cmath>
 
+#include "builtin/encoders/rawsettings.h"
 #include "builtin/encoders/rawvenc.h"
 #include "builtin/encoders/rawvencformats.h"
-#include "core/engine/params.h"
 #include "core/value/qvassert.h"
 
 struct RawVideoParams {
@@ -39,9 +37,6 @@ struct RawVideoParams {
         enc.rate_.setRate(rate);
         return QvStatus::ok;
     }
-    static int settings(Enc& enc, const Any& value) {
-        return value.isDict() ? enc.setParamDict(value.asDict()) : QvStatus::invalidParam;
-    }
     static int acceleration(Enc& enc, const Any& value) {
         return qvparam::convert(value, enc.accelerated_) ? QvStatus::ok : QvStatus::invalidParam;
     }
@@ -52,10 +47,7 @@ struct RawVideoParams {
     static double bitrate(const Enc& enc) {
         return std::trunc(enc.rate_.rate().ratio() * enc.frameBytes_ * 8.0);
     }
-    // Huge pictures pass what an integer holds.
-    static int bitrateInt(const Enc& enc) {
-        return static_cast<int>(std::min(bitrate(enc), static_cast<double>(INT_MAX)));
-    }
+    static int bitrateInt(const Enc& enc) { return rawsettings::bitrateInt(bitrate(enc)); }
     static Any single(double value) { return Any(static_cast<float>(value)); }
 
     template <int number>
@@ -65,13 +57,6 @@ struct RawVideoParams {
     static void vBitrate(const Enc& enc, Any& value) { value = bitrate(enc); }
     static void frameAspect(const Enc& enc, Any& value) {
         value = single(static_cast<double>(enc.width_) / enc.height_);
-    }
-    static void bitrateRange(const Enc& enc, Any& value) {
-        AnyDict constant("type", static_cast<int>(QvBitrate::cbr));
-        constant.set("range", AnyVector(bitrateInt(enc)));
-        AnyVector ranges;
-        ranges.append(constant);
-        value = ranges;
     }
     static void sizeRange(const Enc&, Any& value) {
         value = AnyDict("wmin", 32, "wmax", 4096, "hmin", 32, "hmax", 4096);
@@ -83,7 +68,7 @@ struct RawVideoParams {
 std::span<const QvParamRow<RawVideoEnc>> RawVideoParams::rows() {
     using E = const Enc&;
     static const QvParamRow<Enc> table[] = {
-        {"settings", Access{settings, nullptr}},
+        {"settings", Access{rawsettings::apply<Enc>, nullptr}},
         {"firstPass", {}, qvParamIgnored},
         {"twoPass", {}, qvParamIgnored},
         {"meta", {}, qvParamIgnored},
@@ -111,7 +96,7 @@ std::span<const QvParamRow<RawVideoEnc>> RawVideoParams::rows() {
         {"frameAspectEx", Access{nullptr, [](E, Any& v) { v = 0.0; }}},
         {"_outFrameSize", Access{nullptr, [](E e, Any& v) { v = e.frameBytes_; }}},
         {"dstBuffSize", Access{nullptr, [](E e, Any& v) { v = e.frameBytes_ + 10; }}},
-        {"bitrateRange", Access{nullptr, bitrateRange}},
+        {"bitrateRange", Access{nullptr, [](E e, Any& v) { v = rawsettings::bitrateRange(bitrateInt(e)); }}},
         {"vBitrateRange", Access{nullptr, [](E e, Any& v) { v = AnyVector(bitrateInt(e), bitrateInt(e)); }}},
         {"twoPassPossible", Access{nullptr, fixed<0>}},
         {"previewPossible", Access{nullptr, fixed<1>}},
@@ -139,20 +124,9 @@ void RawVideoEnc::getParam(const char* name, Any& value) const {
     if (!qvGetParamRow(RawVideoParams::rows(), *this, name, value)) QvVideoEncoder::getParam(name, value);
 }
 
-void RawVideoEnc::store(AnyDict& state) const {
-    state.clear();
-    state.set("name", name());
-    AnyDict settings;
-    qvStoreParamRows(RawVideoParams::rows(), *this, settings);
-    state.set("settingsDict", settings);
-}
+void RawVideoEnc::store(AnyDict& state) const { state = rawsettings::stored(RawVideoParams::rows(), *this); }
 
-// The older form has the settings beside the name, or in "settings".
 int RawVideoEnc::restore(const AnyDict& state) {
-    if (!(state.get("name") == Any(name()))) return setError(QvStatus::failed, "restore - invalid name");
-    const auto& current = state.get("settingsDict");
-    if (current.isDict()) return qvRestoreParamRows(RawVideoParams::rows(), *this, current.asDict());
-    int result = 0;
-    if (state.get("settings").isDict()) result |= setParamDict(state.get("settings").asDict());
-    return result | qvRestoreParamRows(RawVideoParams::rows(), *this, state);
+    if (state.get("name") != name()) return setError(QvStatus::failed, "restore - invalid name");
+    return rawsettings::restore(RawVideoParams::rows(), *this, state);
 }

@@ -1,0 +1,51 @@
+// What the raw encoders share: the form in which they store their parameter tables, and how they state a
+// constant bit rate.
+#pragma once
+
+#include <algorithm>
+#include <climits>
+
+#include "core/engine/params.h"
+#include "core/media/bitrate.h"
+
+namespace rawsettings {
+
+// Beyond what an integer holds the largest one.
+template <class Number>
+int bitrateInt(Number bitsPerSecond) {
+    return static_cast<int>(std::min(bitsPerSecond, static_cast<Number>(INT_MAX)));
+}
+
+// The one range of an encoder that has no choice.
+inline Any bitrateRange(int bitsPerSecond) {
+    AnyDict constant("type", static_cast<int>(QvBitrate::cbr));
+    constant.set("range", AnyVector(bitsPerSecond));
+    AnyVector ranges;
+    ranges.append(constant);
+    return ranges;
+}
+
+// "settings": a dictionary of parameters.
+template <class Encoder>
+int apply(Encoder& encoder, const Any& settings) {
+    return settings.isDict() ? encoder.setParamDict(settings.asDict()) : QvStatus::invalidParam;
+}
+
+template <class Encoder>
+AnyDict stored(std::span<const QvParamRow<Encoder>> rows, const Encoder& encoder) {
+    AnyDict settings;
+    qvStoreParamRows(rows, encoder, settings);
+    return AnyDict("name", encoder.name(), "settingsDict", settings);
+}
+
+// The older form has the settings beside the name, or in "settings". The caller has checked the name.
+template <class Encoder>
+int restore(std::span<const QvParamRow<Encoder>> rows, Encoder& encoder, const AnyDict& state) {
+    const Any& current = state.get("settingsDict");
+    if (current.isDict()) return qvRestoreParamRows(rows, encoder, current.asDict());
+    const Any& older = state.get("settings");
+    const int result = older.isDict() ? encoder.setParamDict(older.asDict()) : QvStatus::ok;
+    return result | qvRestoreParamRows(rows, encoder, state);
+}
+
+}  // namespace rawsettings
