@@ -59,72 +59,68 @@ class Operation {
     std::optional<QVThreads::QvLock> guard_;
 };
 
-unsigned char* inRequest(bufstream* bs, unsigned n) {
-    Operation op(bs);
-    unsigned char* block = FifoOps::inRequest(bs, n);
-    op.line("fifow_request numSamples=%u, ret=%p, empty=%u", n, static_cast<void*>(block),
-            FifoOps::inUsable(bs));
-    return block;
-}
+// The plain operations of a side, and what the log calls it and the count that is left to it.
+struct Input {
+    static constexpr char name[] = "fifow";
+    static constexpr char left[] = "empty";
+    static constexpr auto usable = FifoOps::inUsable;
+    static constexpr auto request = FifoOps::inRequest;
+    static constexpr auto confirm = FifoOps::inConfirm;
+    static constexpr auto copy = FifoOps::inCopy;
+    static constexpr auto aux = FifoOps::inAux;
+};
+struct Output {
+    static constexpr char name[] = "fifor";
+    static constexpr char left[] = "full";
+    static constexpr auto usable = FifoOps::outUsable;
+    static constexpr auto request = FifoOps::outRequest;
+    static constexpr auto confirm = FifoOps::outConfirm;
+    static constexpr auto copy = FifoOps::outCopy;
+    static constexpr auto aux = FifoOps::outAux;
+};
 
-unsigned inConfirm(bufstream* bs, unsigned n) {
-    Operation op(bs);
-    const unsigned done = FifoOps::inConfirm(bs, n);
-    op.line("fifow_confirm numSamples=%u, ret=%u, empty=%u", n, done, FifoOps::inUsable(bs));
-    return done;
-}
-
-unsigned inCopy(bufstream* bs, unsigned char* p, unsigned n) {
-    Operation op(bs);
-    const unsigned done = FifoOps::inCopy(bs, p, n);
-    op.line("fifow_copybytes numSamples=%u, ret=%u, empty=%u", n, done, FifoOps::inUsable(bs));
-    return done;
-}
-
-unsigned inAux(bufstream* bs, unsigned offset, unsigned id, void* info, unsigned size) {
-    Operation op(bs);
-    op.line("fifow_auxinfo id=%d (%s) size=%d", static_cast<int>(id), qvAuxInfoName(id),
-            static_cast<int>(size));
-    return FifoOps::inAux(bs, offset, id, info, size);
-}
-
-unsigned char* outRequest(bufstream* bs, unsigned n) {
-    Operation op(bs);
-    unsigned char* block = FifoOps::outRequest(bs, n);
-    op.line("fifor_request numSamples=%u, ret=%p, full=%u", n, static_cast<void*>(block),
-            FifoOps::outUsable(bs));
-    return block;
-}
-
-unsigned outConfirm(bufstream* bs, unsigned n) {
-    Operation op(bs);
-    const unsigned done = FifoOps::outConfirm(bs, n);
-    op.line("fifor_confirm numSamples=%u, ret=%u, full=%u", n, done, FifoOps::outUsable(bs));
-    return done;
-}
-
-unsigned outCopy(bufstream* bs, unsigned char* p, unsigned n) {
-    Operation op(bs);
-    const unsigned done = FifoOps::outCopy(bs, p, n);
-    op.line("fifor_copybytes numSamples=%u, ret=%u, full=%u", n, done, FifoOps::outUsable(bs));
-    return done;
-}
-
-unsigned outAux(bufstream* bs, unsigned offset, unsigned id, void* info, unsigned size) {
-    Operation op(bs);
-    op.line("fifor_auxinfo id=%d (%s) size=%d", static_cast<int>(id), qvAuxInfoName(id),
-            static_cast<int>(size));
-    return FifoOps::outAux(bs, offset, id, info, size);
-}
+template <class Side>
+struct Traced {
+    static unsigned char* request(bufstream* bs, unsigned n) {
+        Operation op(bs);
+        unsigned char* block = Side::request(bs, n);
+        op.line("%s_request numSamples=%u, ret=%p, %s=%u", Side::name, n, static_cast<void*>(block),
+                Side::left, Side::usable(bs));
+        return block;
+    }
+    static unsigned confirm(bufstream* bs, unsigned n) {
+        Operation op(bs);
+        const unsigned done = Side::confirm(bs, n);
+        op.line("%s_confirm numSamples=%u, ret=%u, %s=%u", Side::name, n, done, Side::left, Side::usable(bs));
+        return done;
+    }
+    static unsigned copy(bufstream* bs, unsigned char* p, unsigned n) {
+        Operation op(bs);
+        const unsigned done = Side::copy(bs, p, n);
+        op.line("%s_copybytes numSamples=%u, ret=%u, %s=%u", Side::name, n, done, Side::left,
+                Side::usable(bs));
+        return done;
+    }
+    static unsigned aux(bufstream* bs, unsigned offset, unsigned id, void* info, unsigned size) {
+        Operation op(bs);
+        op.line("%s_auxinfo id=%d (%s) size=%d", Side::name, static_cast<int>(id), qvAuxInfoName(id),
+                static_cast<int>(size));
+        return Side::aux(bs, offset, id, info, size);
+    }
+    static void install(bufstream& bs) {
+        bs.request = request;
+        bs.confirm = confirm;
+        bs.copybytes = copy;
+        bs.auxinfo = aux;
+    }
+};
 
 }  // namespace
 
 FifoObjectPtr QvBufFifoDbg::makeObject(unsigned size, unsigned chunk) {
     FifoObjectPtr object = fifoMake<DbgFifo>(size, chunk);
     if (!object) return object;
-    bufstream& in = object->in;
-    bufstream& out = object->out;
-    DbgFifo* dbg = dbgOf(&in);
+    DbgFifo* dbg = dbgOf(&object->in);
     if (params().get("global_lock").isTrue()) {
         dbg->lock = &globalLock();
         qv_dbg()->debug("buf_fifo @ %p: using global lock %p", static_cast<void*>(object.get()),
@@ -134,13 +130,7 @@ FifoObjectPtr QvBufFifoDbg::makeObject(unsigned size, unsigned chunk) {
         dbg->log = [](const char* text) { qv_dbg()->logs(QvLogMask::progress, text); };
         qv_dbg()->debug("buf_fifo @ %p: logging traffic", static_cast<void*>(object.get()));
     }
-    in.request = inRequest;
-    in.confirm = inConfirm;
-    in.copybytes = inCopy;
-    in.auxinfo = inAux;
-    out.request = outRequest;
-    out.confirm = outConfirm;
-    out.copybytes = outCopy;
-    out.auxinfo = outAux;
+    Traced<Input>::install(object->in);
+    Traced<Output>::install(object->out);
     return object;
 }
