@@ -34,8 +34,7 @@ void copyPlane(QvFrame& to, const QvFrame& from, int plane) {
     std::memcpy(target, source, static_cast<size_t>(to.plane_bytes(plane) % toStride));
 }
 
-// Into a frame with the default strides. Unlike a frame's own assignment this takes every row of I422, and no
-// metadata.
+// Into a frame with the default strides. Unlike a frame's own assignment this takes every row of I422.
 int copyPacked(QvFrame& to, const QvFrame& from) {
     if (to.four_cc() != from.four_cc() || to.width() != from.width() || to.height() != from.height() ||
         !to.inited())
@@ -44,6 +43,7 @@ int copyPacked(QvFrame& to, const QvFrame& from) {
         std::memcpy(to.plane(), from.plane(), static_cast<size_t>(to.total_bytes()));
     else
         for (int plane = 0; plane < to.planes(); ++plane) copyPlane(to, from, plane);
+    to.copyMeta(from);
     return QvStatus::ok;
 }
 
@@ -109,9 +109,6 @@ bool RawVideoEnc::accepts(const QvFrame& frame) const {
            qvEqualFourcc(frame.four_cc(), frameType());
 }
 
-// Without padding behind the rows, so that its memory is what goes out.
-bool RawVideoEnc::isPacked(const QvFrame& frame) const { return frame.total_bytes() == frameBytes_; }
-
 int RawVideoEnc::writeFrame(QvFrame* frame) {
     if (getState() != qvStateOpen) return setError(QvStatus::illegalState, "Not opened");
     if (!frame) return setError(QvStatus::invalidArgument, "No frame given");
@@ -119,14 +116,11 @@ int RawVideoEnc::writeFrame(QvFrame* frame) {
         return setError(QvStatus::invalidArgument, "A frame of %dx%d %s does not fit the output of %dx%d",
                         frame->planes() > 0 ? frame->width(0) : 0, frame->planes() > 0 ? frame->height(0) : 0,
                         frame->planes() > 0 ? frame->str_four_cc() : "no format", width_, height_);
-    if (getOut_) {
-        if (const int result = copyPacked(picture_, *frame)) return setError(result, "Out of memory");
-        picture_.copyMeta(*frame);
-        havePicture_ = true;
-    }
-    if (worker_.joinable()) return enqueue(*frame);
+    if (const int result = copyPacked(picture_, *frame)) return setError(result, "Out of memory");
+    havePicture_ = true;
+    if (worker_.joinable()) return enqueue(picture_);
     // A block that an output without a known fault does not give is a broken contract.
-    const auto outcome = writeOut(*frame);
+    const auto outcome = writeOut(picture_);
     const int result = report(outcome);
     QV_ASSERT_MSG(!outcome.noBlock, errorDesc());
     return result;
@@ -135,16 +129,12 @@ int RawVideoEnc::writeFrame(QvFrame* frame) {
 QvFrame* RawVideoEnc::lastFrame() { return havePicture_ ? &picture_ : nullptr; }
 
 RawVideoEnc::Outcome RawVideoEnc::writeOut(const QvFrame& frame) {
-    if (type_ == QvFourcc::v210) {
-        const QvFrame* picture = nullptr;
-        if (auto outcome = convert(frame, picture); outcome.status != 0) return outcome;
-        auto outcome = writePicture(*picture, frame.total_bytes());
-        converter_->next();
-        return outcome;
-    }
-    if (isPacked(frame)) return writePicture(frame, frame.total_bytes());
-    if (const int result = copyPacked(packed_, frame)) return {result, false, 0, "Out of memory"};
-    return writePicture(packed_, packed_.total_bytes());
+    if (type_ != QvFourcc::v210) return writePicture(frame, frame.total_bytes());
+    const QvFrame* picture = nullptr;
+    if (auto outcome = convert(frame, picture); outcome.status != 0) return outcome;
+    auto outcome = writePicture(*picture, frame.total_bytes());
+    converter_->next();
+    return outcome;
 }
 
 // An output that takes access units apart needs the bytes that it was given; for others the announced count
@@ -258,7 +248,6 @@ int RawVideoEnc::finish(bool discard) {
     }
     converter_.reset();
     picture_.destroy();
-    packed_.destroy();
     havePicture_ = false;
     setState(stateInitialised);
     return result;

@@ -15,8 +15,7 @@
 class QvVideoFilter;
 
 // Each frame goes to the output as the planes of its type, one behind the other with the default strides,
-// and is announced as one access unit. A frame that has that layout already is written straight from the
-// caller's memory. Type v210 takes Y216 frames and converts them.
+// and is announced as one access unit. Type v210 takes Y216 frames and converts them.
 //
 // With "accelerationOn" a worker writes behind a queue of three frames: writeFrame copies the frame there and
 // waits only while all three are taken. A failure of the worker is the result of the next writeFrame and of
@@ -39,7 +38,7 @@ class RawVideoEnc : public QvVideoEncoder {
     int abort() override;
     // QvStatus::invalidArgument for a null frame and for one whose size or FOURCC is not what was set.
     int writeFrame(QvFrame* frame) override;
-    // The latest frame, packed; kept only while "getOut" is on, else null.
+    // The latest frame, packed; null before the first one and after close.
     QvFrame* lastFrame() override;
 
   private:
@@ -56,7 +55,6 @@ class RawVideoEnc : public QvVideoEncoder {
     int remake(int width, int height, unsigned type);
     unsigned frameType() const;
     bool accepts(const QvFrame& frame) const;
-    bool isPacked(const QvFrame& frame) const;
 
     Outcome writeOut(const QvFrame& frame);
     Outcome writePicture(const QvFrame& picture, int announced);
@@ -75,8 +73,7 @@ class RawVideoEnc : public QvVideoEncoder {
     int frameBytes_ = 0;  // of one packed frame, v210 as it is put out
     QvFramerate rate_{25.0};
     int profile_ = 0x1000065;
-    QvFrame picture_;  // the latest frame, while it is kept
-    QvFrame packed_;   // of a frame with padding; the worker's while there is one
+    QvFrame picture_;  // the latest frame
     bool havePicture_ = false;
     bool getOut_ = false;
     bool accelerated_ = false;

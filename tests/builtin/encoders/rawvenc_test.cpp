@@ -87,7 +87,7 @@ TEST_P(RawVideoLayout, PutsOutThePlanesAndAnnouncesThem) {
     }
 }
 
-TEST_F(RawVideo, PacksPaddedRowsAndPassesPackedFramesOn) {
+TEST_F(RawVideo, PacksPaddedRows) {
     format(QvFourcc::I420, 16, 4);
     out_.setParam(rawWriteThrough, 1);
     start();
@@ -139,10 +139,12 @@ TEST_F(RawVideo, AbortDropsWhatIsQueued) {
     for (int i = 0; i < 3; ++i) ASSERT_EQ(enc().writeFrame(&frame), 0);
     out_.waitForWriter();
     auto aborted = std::async(std::launch::async, [&] { return enc().abort(); });
+    EXPECT_EQ(aborted.wait_for(std::chrono::milliseconds(200)), std::future_status::timeout)
+        << "the frame that is being written is finished";
     out_.open();
     EXPECT_EQ(aborted.get(), 0);
-    EXPECT_LT(out_.units.size(), 3u);
-    EXPECT_EQ(out_.data.size(), out_.units.size() * 1024);
+    EXPECT_EQ(out_.units.size(), 1u);
+    EXPECT_EQ(out_.data.size(), 1024u);
     EXPECT_EQ(enc().getState(), QvCodec::stateInitialised);
     EXPECT_EQ(enc().open(), 0) << "it can be used again";
 }
@@ -235,13 +237,11 @@ TEST_F(RawVideo, V210NeedsItsConverter) {
     EXPECT_EQ(enc().close(), 0);
 }
 
-TEST_F(RawVideo, KeepsTheLatestFrameWhenAsked) {
+TEST_F(RawVideo, KeepsTheLatestFrame) {
     format(QvFourcc::GRAY, 32, 32);
     start();
     QvFrame frame = makePicture(QvFourcc::GRAY, 32, 32, 3);
-    enc().writeFrame(&frame);
     EXPECT_EQ(enc().lastFrame(), nullptr);
-    enc().setParam("getOut", 1);
     enc().writeFrame(&frame);
     ASSERT_NE(enc().lastFrame(), nullptr);
     EXPECT_TRUE(pictureBytes(*enc().lastFrame()) == pictureBytes(frame));
