@@ -132,7 +132,8 @@ int RawMux::openVideo(int nr) {
     if (png) {
         output.setParam("width", encoder->getParam("width"));
         output.setParam("height", encoder->getParam("height"));
-        output.setParam("FOURCC", encoder->getParam("selectedFOURCC"));
+        // What comes out of the encoder: of v210 the selected format is what goes in.
+        output.setParam("FOURCC", encoder->getParam("type"));
     }
     output.setParam(rawWriteThrough, split ? 0 : 1);
     outputs_.push_back(std::make_unique<Output>(output, outputName(qvVideoStream, nr),

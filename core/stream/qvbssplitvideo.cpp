@@ -7,6 +7,7 @@
 #include "core/engine/qvfileutil.h"
 #include "core/engine/qvlog.h"
 #include "core/engine/status.h"
+#include "core/filter/qvcolorconvert.h"
 #include "core/media/qvframe.h"
 #include "core/media/qvimage.h"
 #include "core/stream/iofailure.h"
@@ -40,12 +41,23 @@ int QvBsSplitVideo::init(const AnyDict& newParams) {
     baseName_ = QvFile::getBasename(name);
     fileCounter_ = 0;
     png_ = params().get("png").isTrue();
-    if (png_) {
-        extension_ = "png";
-        width_ = params().getInt32("width", 0);
-        height_ = params().getInt32("height", 0);
-        fourcc_ = static_cast<unsigned>(params().getInt32("FOURCC", 0));
+    const int status = png_ ? initPictures() : QvStatus::ok;
+    if (status != QvStatus::ok) destroy(0);
+    return status;
+}
+
+int QvBsSplitVideo::initPictures() {
+    extension_ = "png";
+    width_ = params().getInt32("width", 0);
+    height_ = params().getInt32("height", 0);
+    fourcc_ = static_cast<unsigned>(params().getInt32("FOURCC", 0));
+    if (fourcc_ == QvFourcc::BGR3) return QvStatus::ok;
+    converted_ = std::make_unique<QvFrame>();
+    if (converted_->init(QvFourcc::BGR3, width_, height_) != QvStatus::ok) {
+        qv_log()->error("[split writer] There are no pictures of %dx%d.", width_, height_);
+        return QvStatus::failed;
     }
+    converter_ = std::make_unique<QvColorConverter>(QvFourcc::BGR3, false, false);
     return QvStatus::ok;
 }
 
@@ -67,6 +79,8 @@ void QvBsSplitVideo::destroy(int abort) {
     if (split_) QvBufStreamFifoCb::destroy(abort);
     if (inner_) inner_->destroy(abort);
     inner_.reset();
+    converter_.reset();
+    converted_.reset();
     setInited(false);
 }
 
@@ -151,10 +165,17 @@ bool QvBsSplitVideo::writePicture(bufstream* ring, unsigned bytes, const Any& na
                         frame.str_four_cc(), width_, height_);
         return false;
     }
-    const bool saved = QvImage::saveFrame(frame, name, QvImage::png) == 0;
-    if (!saved) failure()->note(0, "Failed to write to", qv_wide_name(qv_os_name(name)));
+    const bool saved = savePicture(frame, name);
     ring->confirm(ring, bytes);
     return saved;
+}
+
+bool QvBsSplitVideo::savePicture(const QvFrame& frame, const Any& name) {
+    const QvFrame& picture = converter_ ? *converted_ : frame;
+    if (converter_ && converter_->convert(frame, *converted_) != QvStatus::ok) return false;
+    if (QvImage::saveFrame(picture, name, QvImage::png) == QvStatus::ok) return true;
+    failure()->note(0, "Failed to write to", qv_wide_name(qv_os_name(name)));
+    return false;
 }
 
 bool QvBsSplitVideo::writeFile(bufstream* ring, unsigned bytes, const Any& name) {

@@ -10,19 +10,22 @@
 
 #include "core/stream/qvbuffifo.h"
 
+class QvColorConverter;
 class QvFileBufStream;
+class QvFrame;
 
 // Parameters: "outfilename"; "split" Int32 0 for a plain file, anything else for files NAME#0.EXT, NAME#1.EXT
 // and so on; "nrDigits" (Int32), width of the number, with zeros in front; "png" true to write each access
 // unit as a PNG picture, which "width", "height" and "FOURCC" describe. "chunk" must hold a whole picture
-// then.
+// then, and formats other than BGR3 need the module "scaler".
 class QV_API QvBsSplitVideo : public QvBufStreamFifoCb {
   public:
     explicit QvBsSplitVideo(QvCodec* owner = nullptr);
     ~QvBsSplitVideo() override;
 
     using QvBufStream::init;
-    int init(const AnyDict& params) override;  // asserts that "outfilename" is text
+    // Asserts that "outfilename" is text. -1 for pictures that can't be.
+    int init(const AnyDict& params) override;
     void destroy(int abort) override;
     void flush() override;
     bufstream* input() override;
@@ -37,9 +40,11 @@ class QV_API QvBsSplitVideo : public QvBufStreamFifoCb {
 
   private:
     int initPlain(const AnyDict& params);
+    int initPictures();
     Any _currentFilename() const;
     void writeAccessUnit(unsigned bytes);
     bool writePicture(bufstream* ring, unsigned bytes, const Any& name);
+    bool savePicture(const QvFrame& frame, const Any& name);
     bool writeFile(bufstream* ring, unsigned bytes, const Any& name);
 
     TPtrList<QvAuxInfoObserver> observers_;
@@ -51,6 +56,9 @@ class QV_API QvBsSplitVideo : public QvBufStreamFifoCb {
     int width_ = 0, height_ = 0;
     unsigned fourcc_ = 0;
     std::unique_ptr<QvFileBufStream> inner_;  // null in split mode
+    // To BGR3; null unless the pictures have another format.
+    std::unique_ptr<QvColorConverter> converter_;
+    std::unique_ptr<QvFrame> converted_;
 };
 
 // Parameters: "outfilename"; "isPcm" Int32 0 for a plain file, anything else for WAV; "split" true for one

@@ -174,20 +174,73 @@ TEST_F(RawMuxing, OneFileForEachPicture) {
 }
 
 TEST_F(RawMuxing, PicturesAsPng) {
-    streams(1, 0);
-    videoFormat(QvFourcc::BGR3, 34, 20);
-    pipe_->setParam("muxer/splitVideo", 1);
-    pipe_->setParam("muxer/rawAsPng", 1);
-    ASSERT_EQ(pipe_->open(), 0);
-    QvFrame frame = makePicture(QvFourcc::BGR3, 34, 20);
-    for (int i = 0; i < 2; ++i) ASSERT_EQ(pipe_->writeFrame(&frame, 0), 0);
-    ASSERT_EQ(pipe_->close(), 0);
-    ASSERT_EQ(names(mux("filesWritten")), (Names{"out#0.png", "out#1.png"}));
-    QvFrame loaded;
-    ASSERT_EQ(QvImage::loadFrame(loaded, Any(folder_.file("out#1.png").c_str()), nullptr, 0), 0);
-    for (int y = 0; y < 20; ++y)
-        for (int x = 0; x < 34; ++x)
-            for (int c = 0; c < 3; ++c) ASSERT_EQ(loaded.pixelPtr(x, y)[c], frame.pixelPtr(x, y)[c]);
+    for (const unsigned type : {QvFourcc::BGR3, QvFourcc::BGR4}) {
+        streams(1, 0);
+        videoFormat(type, 34, 20);
+        pipe_->setParam("muxer/splitVideo", 1);
+        pipe_->setParam("muxer/rawAsPng", 1);
+        LogCapture log;
+        ASSERT_EQ(pipe_->open(), 0);
+        QvFrame frame = makePicture(type, 34, 20);
+        for (int i = 0; i < 2; ++i) ASSERT_EQ(pipe_->writeFrame(&frame, 0), 0);
+        ASSERT_EQ(pipe_->close(), 0);
+        EXPECT_EQ(log.count("Starting scaler"), type == QvFourcc::BGR3 ? 0 : 1) << "one for all pictures";
+        ASSERT_EQ(names(mux("filesWritten")), (Names{"out#0.png", "out#1.png"}));
+        QvFrame loaded;
+        ASSERT_EQ(QvImage::loadFrame(loaded, Any(folder_.file("out#1.png").c_str()), nullptr, 0), 0);
+        for (int y = 0; y < 20; ++y)
+            for (int x = 0; x < 34; ++x)
+                for (int c = 0; c < 3; ++c) ASSERT_EQ(loaded.pixelPtr(x, y)[c], frame.pixelPtr(x, y)[c]);
+        for (const char* name : {"out#0.png", "out#1.png"}) std::filesystem::remove(folder_.file(name));
+    }
+}
+
+// Samples of one picture of v210: 10 bits, three to a word, in the order Cb Y Cr Y.
+std::vector<unsigned> v210Samples(const std::string& bytes, int width, int height) {
+    std::vector<unsigned> samples;
+    const size_t line = static_cast<size_t>(width + 47) / 48 * 128;
+    for (int y = 0; y < height; ++y)
+        for (int i = 0; i < 2 * width; ++i) {
+            const unsigned word =
+                little(bytes, static_cast<size_t>(y) * line + static_cast<size_t>(i / 3) * 4, 4);
+            samples.push_back(word >> (i % 3 * 10) & 0x3FF);
+        }
+    return samples;
+}
+
+// Y216 goes in, also from the worker, into one file and into one for each picture.
+TEST_F(RawMuxing, V210) {
+    constexpr int width = 50, height = 6;
+    constexpr size_t bytes = 2 * 128 * height;
+    std::vector<QvFrame> pictures;
+    for (unsigned i = 0; i < 3; ++i) pictures.push_back(makePicture(QvFourcc::Y216, width, height, i));
+    for (const int accelerated : {0, 1})
+        for (const int split : {0, 1}) {
+            SCOPED_TRACE(testing::Message() << "worker " << accelerated << " split " << split);
+            streams(1, 0);
+            videoFormat(QvFourcc::v210, width, height);
+            pipe_->setParam("video0/accelerationOn", accelerated);
+            pipe_->setParam("muxer/splitVideo", split);
+            ASSERT_EQ(pipe_->open(), 0);
+            for (QvFrame& picture : pictures) ASSERT_EQ(pipe_->writeFrame(&picture, 0), 0);
+            ASSERT_EQ(pipe_->close(), 0) << pipe_->errorDesc();
+            std::string content;
+            for (const auto& name : names(mux("filesWritten"))) {
+                content += read(name.c_str());
+                std::filesystem::remove(folder_.file(name));
+            }
+            ASSERT_EQ(content.size(), 3 * bytes);
+            for (size_t i = 0; i < 3; ++i) {
+                const auto samples = v210Samples(content.substr(i * bytes, bytes), width, height);
+                for (size_t k = 0; k < samples.size(); ++k) {
+                    const auto* source = pictures[i].plane(0) +
+                                         k / (2 * width) * static_cast<size_t>(pictures[i].stride(0)) +
+                                         (k % (2 * width) ^ 1) * 2;
+                    const int ten = (source[0] | source[1] << 8) >> 6;
+                    ASSERT_NEAR(static_cast<int>(samples[k]), ten, 1) << "picture " << i << " sample " << k;
+                }
+            }
+        }
 }
 
 // What an abort leaves is known, so that nothing that looks whole need stay.
