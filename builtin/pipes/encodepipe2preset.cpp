@@ -82,8 +82,9 @@ int EncodePipe2::applyPreset(const QvPreset& given, int keep) {
     qv_dbg()->info("Applying custom preset '%s'.", preset.name());
     const int base = qvPresetMgr()->findByProfile(preset.profile());
     if (base < 0)
-        return setError(QvStatus::failed, "Cannot apply preset '%s', base profile %s (%d) not loaded.",
-                        preset.name(), qvProfileToSym(preset.profile()), preset.profile());
+        return setError(QvStatus::invalidStructure,
+                        "Cannot apply preset '%s', base profile %s (%d) not loaded.", preset.name(),
+                        qvProfileToSym(preset.profile()), preset.profile());
     const AnyVector former = describeForRebuild();
     removeStreams(qvAllStreams);
     int result = QvStatus::ok;
