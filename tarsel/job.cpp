@@ -176,7 +176,7 @@ void Job::planStream(Source& source, int type, int number) {
         stream.channels = options_.channels.value_or(intParam(decoder, type, number, "channels"));
         stream.bits = options_.bits.value_or(intParam(decoder, type, number, "bitsPerSample"));
     }
-    streams_.push_back(std::move(stream));
+    streams_.push_back(stream);
 }
 
 // The end of a stream: an instant whose position is the count of its frames or samples. Not every rate

@@ -189,7 +189,7 @@ Any QvFile::changeExt(const Any& name, const Any& ext) {
 Any QvFile::joinPath(const Any& first, const Any& second) { return joinPath(AnyVector(first, second)); }
 
 Any QvFile::joinPath(const AnyVector& parts) {
-    if (parts.size() == 0) return Any("");
+    if (parts.empty()) return Any("");
     if (parts.size() == 1) return parts.at(0);
     return hasWide(parts) ? toAny(joined<unsigned short>(parts)) : toAny(joined<char>(parts));
 }

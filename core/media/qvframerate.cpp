@@ -128,7 +128,7 @@ int QvFramerate::findInVector(const AnyVector& rates, bool exact, bool compareDf
 }
 
 #define QV_NAMED_RATE(name, num, den, scan, value)                                  \
-    bool QvFramerate::is##name() const { return isNamed(*this, value, scan != 0); } \
+    bool QvFramerate::is##name() const { return isNamed(*this, value, (scan) != 0); } \
     const QvFramerate& QvFramerate::f##name() {                                     \
         static const QvFramerate constant = named(num, den, scan);                  \
         return constant;                                                            \

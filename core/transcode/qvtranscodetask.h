@@ -26,7 +26,7 @@
 
 class QvDecodePipe;
 class QvEncodePipe;
-class QvFileOpenCb;
+struct QvFileOpenCb;
 class TransLink;
 class TransVLink;
 

@@ -144,7 +144,7 @@ int QvTranscodeRun::totalFrames(const QvTask& task, double& rate) {
     }
     const auto links = task.links();
     int total = 0;
-    if (links.size() > 0 && links.at(0)->type() == 1) total = links.at(0)->totalOutFrames();
+    if (!links.empty() && links.at(0)->type() == 1) total = links.at(0)->totalOutFrames();
     if (total != 0) return total;
     for (int i = 0; i < links.size(); ++i) {
         const MediaTime length = links.at(i)->outPoint() - links.at(i)->inPoint();

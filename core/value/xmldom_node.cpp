@@ -50,7 +50,7 @@ Any XmlNode::rawData() const { return qvXmlText(data_); }
 void XmlNode::addRawData(const char* text, int size) {
     QV_ASSERT(text && size >= -1);
     const std::size_t count = size < 0 ? std::strlen(text) : static_cast<std::size_t>(size);
-    const auto total = static_cast<long long>(data_.size() + count);
+    const long long total = std::ssize(data_) + static_cast<long long>(count);
     if (total >= capacity_ - 1) {
         const long long grown = static_cast<long long>(count) + 2LL * capacity_;
         QV_ASSERT(grown <= 0x7FFFFFFF);
