@@ -317,7 +317,7 @@ TEST_F(EncodePipeTest, UserPresets) {
     EXPECT_EQ(pipe().nrStreams(), 1);
     EXPECT_EQ(get("audio0/channels"), Any(6));
 
-    EXPECT_EQ(pipe().applyPreset(QvPreset(0x2010001, "gone"), 0), -1);
+    EXPECT_EQ(pipe().applyPreset(QvPreset(0x2010001, "gone"), 0), QvStatus::invalidStructure);
     EXPECT_EQ(std::string(pipe().errorDesc()).rfind("Cannot apply preset 'gone', base profile ", 0), 0u);
     EXPECT_EQ(pipe().applyPreset(0x2010001, 0), QvStatus::invalidStructure);
     EXPECT_STREQ(pipe().errorDesc(), "Invalid preset #33619969");
