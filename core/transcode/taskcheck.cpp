@@ -47,7 +47,7 @@ void appendLine(std::string& text, std::string_view line, const char* separator)
 // converters do not count.
 std::string soundFilters(const AnyDict& params) {
     std::string names;
-    const AnyVector& filters = params.getDict("filters", AnyDict()).getVector("customFilters", AnyVector());
+    const AnyVector& filters = params.getDict("filters").getVector("customFilters");
     for (int i = 0; i < filters.size(); ++i) {
         if (!filters.at(i).isDict() || !filters.at(i).asDict().get("_on").isTrue()) continue;
         const std::string_view name = filters.at(i).asDict().getString("name", "");

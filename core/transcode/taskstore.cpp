@@ -33,16 +33,16 @@ AnyDict storedProcessParams(const AnyVector& streams, int type, int number) {
     for (int i = 0; i < streams.size(); ++i) {
         if (!streams.at(i).isDict() || streams.at(i).asDict().getInt32("type", 0) != type) continue;
         if (number-- > 0) continue;
-        const AnyVector sources = streams.at(i).asDict().getVector("sources", AnyVector());
+        const AnyVector sources = streams.at(i).asDict().getVector("sources");
         if (!sources.at(0).isDict()) break;
-        return sources.at(0).asDict().getDict("process", AnyDict());
+        return sources.at(0).asDict().getDict("process");
     }
     return AnyDict();
 }
 
 // Null when it can't be opened, also because its settings are of a decoder that is not installed.
 QvDecodePipe* openInput(const AnyDict& file, QvFileOpenCb* callback) {
-    const AnyDict settings = file.getDict("decoder", AnyDict());
+    const AnyDict settings = file.getDict("decoder");
     if (!settings.get("name").isString())
         return QvDecFactory::decodePipe(file.get("filename"), Any(), callback, nullptr);
     try {
@@ -126,7 +126,7 @@ int QvTask::restore(const AnyDict& state, QvDPipeList& decoders, QvEncodePipe** 
         QV_FAIL(errorDesc());
     }
     const Any& settings = state.get("encoder");
-    const AnyVector streams = state.getVector("streams", AnyVector());
+    const AnyVector streams = state.getVector("streams");
     const char* noStreams = "Task.restore: Invalid task state structure - no output streams";
     if (streams.empty()) return setError(QvStatus::invalidStructure, "%s", noStreams);
     if (!settings.isDict() || settings.asDict().empty()) {
@@ -134,14 +134,14 @@ int QvTask::restore(const AnyDict& state, QvDPipeList& decoders, QvEncodePipe** 
         return setError(QvStatus::invalidStructure,
                         "Task.restore: Invalid task state structure - missing encoder settings");
     }
-    if (settings.asDict().getVector("streams", AnyVector()).empty())
+    if (settings.asDict().getVector("streams").empty())
         return setError(QvStatus::invalidStructure, "%s", noStreams);
     std::unique_ptr<QvEncodePipe> pipe(QvEncodePipe::create());
     QV_ASSERT_MSG(pipe, "Task.restore: could not create EncodePipe");
     if (const int result = pipe->restore(settings.asDict()); result != QvStatus::ok)
         return setError(result, "Task.restore: %s", pipe->errorDesc());
     if (state.get("filename").isText()) pipe->setFilename(state.get("filename"));
-    const AnyVector& files = state.getVector("files", AnyVector());
+    const AnyVector& files = state.getVector("files");
     if (files.empty())
         return setError(QvStatus::invalidStructure,
                         "Task.restore: invalid task state structure - no input file(s) specified");
@@ -167,7 +167,7 @@ int QvTask::linkStoredStream(const AnyDict& entry, int index, const QvDPipeList&
     QvOStream* stream = pipe.streamAt(index);
     const int number = pipe.streamNr(stream);
     QV_ASSERT(entry.empty() || entry.getInt32("type", 0) == stream->type);
-    const AnyVector sources = entry.getVector("sources", AnyVector());
+    const AnyVector sources = entry.getVector("sources");
     if (sources.empty() || !sources.at(0).isDict()) {
         qv_dbg()->warning("QvTask::restore: No source(s) defined for stream %d", index);
         return QvStatus::ok;
@@ -182,7 +182,7 @@ int QvTask::linkStoredStream(const AnyDict& entry, int index, const QvDPipeList&
     QV_ASSERT_MSG(decoder, "no available decoders, decoder must be cloned...");
     if (!decoder->isSelected(address.first, address.second)) decoder->select(address.first, address.second);
     ProcessParams params;
-    params.update(source.getDict("process", AnyDict()));
+    params.update(source.getDict("process"));
     return link(decoder, address.first, address.second, number, params);
 }
 
@@ -206,11 +206,11 @@ QvTask* QvTask::fromStateWithSource(const AnyDict& state, QvDecodePipe* decoder,
     QV_ASSERT(decoder);
     std::unique_ptr<QvEncodePipe> pipe(QvEncodePipe::create());
     QV_ASSERT_MSG(pipe, "Task.restore: could not create EncodePipe");
-    if (pipe->restore(state.getDict("encoder", AnyDict())) != QvStatus::ok) return nullptr;
+    if (pipe->restore(state.getDict("encoder")) != QvStatus::ok) return nullptr;
     for (int type : {1, 2}) removeSurplusStreams(*pipe, type, decoder->nrStreams(type));
     auto task = std::make_unique<QvTask>();
     task->setEncoder(pipe.get());
-    const AnyVector streams = state.getVector("streams", AnyVector());
+    const AnyVector streams = state.getVector("streams");
     for (int type : {1, 2, 4}) {
         const int given = decoder->nrStreams(type), wanted = pipe->nrStreams(type);
         if ((typeMask == 0 || (typeMask & type)) && wanted > 0 && given == 0) {
