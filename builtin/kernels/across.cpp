@@ -32,17 +32,24 @@ int wholeTap(const int16_t* weights, int taps) {
     return -1;
 }
 
-bool fitsBlocks(const Axis& axis) {
-    const int half = axis.taps / 2;
-    for (int first = 0; first < axis.target; first += block) {
-        int low = axis.start[static_cast<size_t>(first)], high = low;
-        for (int k = 1; k < block; ++k) {
-            const int start = axis.start[static_cast<size_t>(sampleOf(axis, first + k))];
-            low = std::min(low, start);
-            high = std::max(high, start);
-        }
-        if (high - low + half > 15) return false;
+// The first source sample of a block, and how many samples all of its pairs span; 0 if its weights do not
+// fit.
+struct Reach {
+    int low, span;
+};
+
+Reach reachOf(const Axis& axis, int first) {
+    int low = axis.start[static_cast<size_t>(sampleOf(axis, first))], high = low;
+    for (int k = 1; k < block; ++k) {
+        const int start = axis.start[static_cast<size_t>(sampleOf(axis, first + k))];
+        low = std::min(low, start);
+        high = std::max(high, start);
     }
+    return {low, high - low + axis.taps / 2 + 1};
+}
+
+bool weightsFitBlocks(const Axis& axis) {
+    const int half = axis.taps / 2;
     for (int i = 0; i < axis.target; ++i) {
         const int16_t* w = weightsOf(axis, i);
         const int whole = wholeTap(w, axis.taps);
@@ -54,40 +61,73 @@ bool fitsBlocks(const Axis& axis) {
     return true;
 }
 
-void makeBlocks(const Axis& axis, Across& across) {
-    const int half = axis.taps / 2;
-    const int blocks = (axis.target + block - 1) / block;
-    across.base.resize(static_cast<size_t>(blocks));
-    across.order.resize(static_cast<size_t>(blocks) * 32);
-    across.weights.resize(static_cast<size_t>(blocks) * static_cast<size_t>(half) * 16);
-    for (int b = 0; b < blocks; ++b) {
-        int low = axis.start[static_cast<size_t>(b * block)];
-        for (int k = 1; k < block; ++k)
-            low = std::min(low, axis.start[static_cast<size_t>(sampleOf(axis, b * block + k))]);
+constexpr int window = 16;
+
+// 16-byte windows that the blocks of an axis take: 1, 2, or 0 for more.
+int windowsOf(const Axis& axis) {
+    if (!weightsFitBlocks(axis)) return 0;
+    int windows = 1;
+    for (int first = 0; first < axis.target; first += block) {
+        const int span = reachOf(axis, first).span;
+        if (span > 2 * window) return 0;
+        if (span > window) windows = 2;
+    }
+    return windows;
+}
+
+// A byte that a window does not hold picks nothing.
+Byte orderOf(int at, int which) {
+    const int inside = at - which * window;
+    return inside < 0 || inside >= window ? Byte{0x80} : static_cast<Byte>(inside);
+}
+
+// Tables lie so that two blocks are read at once: order[pairs or centre][window][block][16] and
+// weights[tap][block][16].
+void makeBlocks(const Axis& axis, Across& across, int windows) {
+    const int half = axis.taps / 2, doubles = (axis.target + 2 * block - 1) / (2 * block);
+    across.form = windows == 1 ? Across::blocks : Across::wide;
+    across.base.resize(static_cast<size_t>(doubles) * 2);
+    across.order.resize(static_cast<size_t>(doubles * windows) * 64);
+    across.weights.resize(static_cast<size_t>(doubles * half) * 32);
+    for (int b = 0; b < 2 * doubles; ++b) {
+        const int low = reachOf(axis, b * block).low;
         across.base[static_cast<size_t>(b)] = low;
-        Byte* order = across.order.data() + b * 32;
-        int8_t* weights = across.weights.data() + b * half * 16;
+        Byte* order = across.order.data() + b / 2 * windows * 64 + b % 2 * 16;
+        int8_t* weights = across.weights.data() + b / 2 * half * 32 + b % 2 * 16;
         for (int k = 0; k < block; ++k) {
             const int i = sampleOf(axis, b * block + k);
             const int at = axis.start[static_cast<size_t>(i)] - low;
             const int16_t* w = weightsOf(axis, i);
             const int whole = wholeTap(w, axis.taps);
-            for (int which = 0; which < 2; ++which) {
-                order[which * 16 + 2 * k] = static_cast<Byte>(at);
-                order[which * 16 + 2 * k + 1] = static_cast<Byte>(at + half);
+            const int centre = whole >= half ? half : 0;
+            for (int which = 0; which < windows; ++which) {
+                Byte* all = order + which * 32 + 2 * k;
+                Byte* middle = all + windows * 32;
+                all[0] = orderOf(at, which);
+                all[1] = orderOf(at + half, which);
+                middle[0] = whole >= 0 ? orderOf(at + centre, which) : all[0];
+                middle[1] = whole >= 0 ? orderOf(at + centre, which) : all[1];
             }
             if (whole >= 0) {
-                const auto centre = static_cast<Byte>(at + (whole >= half ? half : 0));
-                order[16 + 2 * k] = order[16 + 2 * k + 1] = centre;
-                weights[(half - 1) * 16 + 2 * k] = weights[(half - 1) * 16 + 2 * k + 1] = unity / 2;
+                weights[(half - 1) * 32 + 2 * k] = weights[(half - 1) * 32 + 2 * k + 1] = unity / 2;
                 continue;
             }
             for (int t = 0; t < half; ++t) {
-                weights[t * 16 + 2 * k] = static_cast<int8_t>(w[t]);
-                weights[t * 16 + 2 * k + 1] = static_cast<int8_t>(w[t + half]);
+                weights[t * 32 + 2 * k] = static_cast<int8_t>(w[t]);
+                weights[t * 32 + 2 * k + 1] = static_cast<int8_t>(w[t + half]);
             }
         }
     }
+}
+
+bool isHalves(const Axis& axis) {
+    constexpr int16_t expected[4] = {32, 64, 32, 0};
+    if (axis.taps != 4) return false;
+    for (int i = 0; i < axis.target; ++i)
+        if (axis.start[static_cast<size_t>(i)] != 2 * i - 1 ||
+            !std::equal(expected, expected + 4, weightsOf(axis, i)))
+            return false;
+    return true;
 }
 
 bool fitsRuns(const Axis& axis) {
@@ -100,11 +140,10 @@ bool fitsRuns(const Axis& axis) {
 }
 
 void makeRuns(const Axis& axis, Across& across) {
-    const int room = (axis.taps + 15) / 16 * 16;
     across.base = axis.start;
-    across.weights.resize(static_cast<size_t>(axis.target) * static_cast<size_t>(room));
-    for (int i = 0; i < axis.target; ++i)
-        std::copy_n(weightsOf(axis, i), axis.taps, across.weights.begin() + static_cast<long>(i) * room);
+    across.weights.resize(axis.weights.size());
+    std::transform(axis.weights.begin(), axis.weights.end(), across.weights.begin(),
+                   [](int16_t weight) { return static_cast<int8_t>(weight); });
 }
 
 }  // namespace
@@ -116,9 +155,11 @@ Across makeAcross(const Axis& axis) {
     across.taps = axis.taps;
     across.offset = axis.offset;
     if (axis.copies) return across;
-    if (axis.taps > 1 && fitsBlocks(axis)) {
-        across.form = Across::blocks;
-        makeBlocks(axis, across);
+    const int windows = axis.taps > 1 ? windowsOf(axis) : 0;
+    if (isHalves(axis)) {
+        across.form = Across::halves;
+    } else if (windows) {
+        makeBlocks(axis, across, windows);
     } else if (axis.taps > 1 && fitsRuns(axis)) {
         across.form = Across::runs;
         makeRuns(axis, across);
@@ -128,6 +169,20 @@ Across makeAcross(const Axis& axis) {
         across.words = axis.weights;
     }
     return across;
+}
+
+std::vector<int8_t> downBytesWeights(const Axis& axis) {
+    if (axis.copies || axis.taps < 2 || !weightsFitBlocks(axis)) return {};
+    const int half = axis.taps / 2;
+    std::vector<int8_t> weights(axis.weights.size());
+    int8_t* to = weights.data();
+    for (int i = 0; i < axis.target; ++i)
+        for (int t = 0; t < half; ++t)
+            for (const int tap : {t, t + half}) {
+                const int weight = weightsOf(axis, i)[tap];
+                *to++ = static_cast<int8_t>(weight == unity ? 0 : weight);
+            }
+    return weights;
 }
 
 void padLine(Byte* to, const Byte* from, int n) {

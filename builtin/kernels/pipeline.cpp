@@ -162,6 +162,8 @@ class Band {
             std::memcpy(to, scaledLine(stage, plane, y), count(width) * sizeof(S));
             return;
         }
+        if constexpr (!deep)
+            if (group.spread != Group::none) return bytesInto(stage, plane, y, to);
         const Axis& down = group.down;
         const Word* words[maxTaps];
         for (int t = 0; t < down.taps; ++t) {
@@ -177,6 +179,43 @@ class Band {
             scaleDown(words, down.copies ? nullptr : down.weights.data() + count(y) * count(down.taps),
                       down.taps, to, width);
         }
+    }
+
+    // Down first, while lines are short.
+    void bytesInto(int stage, int plane, int y, Byte* to) {
+        const Group& group = scaling(stage).of(plane);
+        const int width = group.across.target;
+        const bool asIs = group.spread == Group::asIs;
+        const int n = asIs ? width : group.across.source;
+        const Byte* line = downBytes(stage, plane, y, asIs ? to : lines_.padded.get(), n);
+        if (asIs) {
+            if (line != to) std::memcpy(to, line, count(n));
+        } else if (group.spread == Group::doubled) {
+            doubleLine(to, line, count(width));
+        } else {
+            twice(to, line, count(width / 2));
+            if (width & 1) to[width - 1] = line[width / 2 - 1];
+        }
+    }
+
+    // The source line itself where it is copied, else `to`.
+    const Byte* downBytes(int stage, int plane, int y, Byte* to, int n) {
+        const Group& group = scaling(stage).of(plane);
+        const Axis& down = group.down;
+        const auto at = [&](int line) {
+            return upstream(stage, plane, std::clamp(line, 0, down.source - 1)) + group.across.offset;
+        };
+        if (down.copies) return at(y + down.offset);
+        const int start = down.start[count(y)];
+        if (down.taps == 1) return at(start);
+        const size_t first = count(y) * count(down.taps);
+        const Byte* taps[maxTaps];
+        for (int t = 0; t < down.taps; ++t) {
+            if (down.weights[first + count(t)] == unity) return at(start + t);
+            taps[t] = at(start + t);
+        }
+        scaleDownBytes(taps, group.bytesDown.data() + first, down.taps, to, n);
+        return to;
     }
 
     const Word* wordLine(int stage, int plane, int y) {

@@ -61,6 +61,15 @@ struct Maker {
         return made;
     }
 
+    // Where nothing is filtered across, or by two, the pass down works on bytes, if its weights let it.
+    void setSpread(Group& group, Group::Spread spread) const {
+        if (plan.deep || group.empty() || group.across.target == 0) return;
+        if (group.across.copies) spread = Group::asIs;
+        if (spread == Group::none) return;
+        group.bytesDown = downBytesWeights(group.down);
+        if (group.down.copies || group.down.taps == 1 || !group.bytesDown.empty()) group.spread = spread;
+    }
+
     // `from` and `to`: whose chroma grids are met; null: chroma at luma size.
     Scaling scaling(const Mapping& across, const Mapping& downFrame, const Format* from, const Format* to,
                     int sourceWidth, int sourceHeight, int field) const {
@@ -84,8 +93,12 @@ struct Maker {
                                  request.width / toAcross.factor, filterOf(across)),
                             axis(chromaMapping(down, fromDown, toDown), lines(sourceHeight / fromDown.factor),
                                  lines(request.height / toDown.factor), filterOf(down)));
-        made.chroma.doubles = !plan.deep && filterOf(across) == Filter::linear &&
-                              chromaAcross == Mapping{0, 0.5} && request.width / 2 == sourceWidth / 2;
+        const bool everySecond = chromaAcross == Mapping{0, 0.5} && request.width / 2 == sourceWidth / 2;
+        setSpread(made.luma, Group::none);
+        setSpread(made.chroma, !everySecond                          ? Group::none
+                               : filterOf(across) == Filter::nearest ? Group::repeated
+                               : filterOf(across) == Filter::linear  ? Group::doubled
+                                                                     : Group::none);
         return made;
     }
 };

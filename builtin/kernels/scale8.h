@@ -15,15 +15,23 @@ namespace srk {
 
 using Byte = unsigned char;
 
-// What the pass across reads for eight target samples at a time. Where these lie close enough together, each
-// pair of taps is picked out of 16 source bytes; else every sample has its own run of taps.
+// What the pass across reads for sixteen target samples at a time, in two blocks of eight. Where the samples
+// of a block lie close enough together, each pair of taps is picked out of 16 or 32 source bytes; else every
+// sample has its own run of taps.
 struct Across {
     int target = 0, source = 0, taps = 1;
-    enum Form : uint8_t { copy, blocks, runs, plain } form = copy;
+    enum Form : uint8_t {
+        copy,
+        halves,  // every second sample with a quarter of each neighbour
+        blocks,
+        wide,  // blocks of 32 source bytes
+        runs,
+        plain
+    } form = copy;
     int offset = 0;               // of a copy
     std::vector<int32_t> base;    // of a block, or of each sample
-    std::vector<Byte> order;      // for each block: which bytes, for the pairs and for the centre pair
-    std::vector<int8_t> weights;  // blocks: 16 for each pair of taps; runs: taps rounded up to 16
+    std::vector<Byte> order;      // for two blocks: which bytes, for all pairs and for the centre pair
+    std::vector<int8_t> weights;  // for two blocks: 32 for each pair of taps; runs: taps of each sample
     std::vector<int16_t> words;   // plain: taps of each sample
 };
 Across makeAcross(const Axis& axis);
@@ -40,6 +48,15 @@ void padLine(Byte* to, const Byte* from, int n);  // `to` is where sample 0 goes
 void scaleAcross(const Across& across, const Byte* from, int16_t* to);
 // `taps` lines of words, taps even or 1.
 void scaleDown(const int16_t* const* lines, const int16_t* weights, int taps, Byte* to, int n);
+
+// The pass down alone, on bytes: taps are even; for each two a pair of weights, of tap t and of tap t + taps
+// /
+// 2. Rounded to the nearest.
+void scaleDownBytes(const Byte* const* lines, const int8_t* weights, int taps, Byte* to, int n);
+
+// The weights of each line of an axis as scaleDownBytes takes them. Empty: they do not fit bytes. A weight
+// of 128, the copy of a line, stands as 0 and must not be used.
+std::vector<int8_t> downBytesWeights(const Axis& axis);
 
 const char* scale8Unit();
 

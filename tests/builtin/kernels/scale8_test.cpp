@@ -4,7 +4,10 @@
 #include <gtest/gtest.h>
 
 #include <cmath>
+#include <memory>
 #include <numeric>
+#include <string>
+#include <vector>
 
 #include "tests/builtin/kernels/guarded.h"
 #include "tests/builtin/kernels/targets.h"
@@ -119,6 +122,33 @@ TEST(Scale8, LinesAreAddedUpAlike) {
                 if (expected.empty()) expected = bytes;
                 ASSERT_EQ(bytes, expected) << taps << " taps, " << n << " on " << hwy::TargetName(target);
                 EXPECT_TRUE(to.frontIntact());
+            }
+        }
+}
+
+TEST(Scale8, LinesOfBytesAreAddedUpAlike) {
+    // Pairs of taps that lie half of the filter apart.
+    const std::vector<int8_t> sets[] = {
+        {50, 78}, {-10, 74, 74, -10}, {3, 80, -19, -19, 80, 3}, {-2, 79, 7, -20, -20, 7, 79, -2}};
+    for (const auto& weights : sets)
+        for (int n = 1; n <= 129; ++n) {
+            std::vector<std::unique_ptr<Guarded>> lines;
+            std::vector<const Byte*> starts;
+            const auto taps = static_cast<int>(weights.size());
+            for (int t = 0; t < taps; ++t) {
+                starts.push_back(lines
+                                     .emplace_back(std::make_unique<Guarded>(static_cast<size_t>(n),
+                                                                             static_cast<unsigned>(t)))
+                                     ->data());
+            }
+            std::string expected;
+            for (const auto target : machineTargets()) {
+                Guarded to(static_cast<size_t>(n), 9);
+                const OnTarget only(target);
+                scaleDownBytes(starts.data(), weights.data(), taps, to.data(), n);
+                const std::string bytes(reinterpret_cast<char*>(to.data()), to.size());
+                if (expected.empty()) expected = bytes;
+                ASSERT_EQ(bytes, expected) << taps << " taps, " << n << " on " << hwy::TargetName(target);
             }
         }
 }
