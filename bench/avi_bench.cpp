@@ -87,7 +87,8 @@ void benchWriting(QvRatioBench& bench, const TempFolder& folder, unsigned type, 
                             write(file, sound.ptr(0), samples * 4) == samples * 4,
                         "write failed");
             close(file);
-        });
+        },
+        15);
 }
 
 void countCopies() {
