@@ -3,26 +3,15 @@
 #include <cstring>
 
 #include "builtin/creators.h"
-#include "builtin/sinks/qvfilebuiltins.h"
 #include "core/engine/qvlog.h"
+#include "core/stream/qvfilebufstream.h"
 #include "core/value/qvassert.h"
 
 void NullMux::getParam(const char* name, Any& value) const {
     if (std::strcmp(name, "maxStreams") == 0)
         value = AnyDict("vids", 99, "auds", 99, "subs", 99, "total", 99);
     else
-        BaseMuxer::getParam(name, value);
-}
-
-int NullMux::attachOutStream(QvBufStream* stream) {
-    if (const int result = BaseMuxer::attachOutStream(stream)) return result;
-    stream->setParam(qvSinkDoNothing, 1);
-    return QvStatus::ok;
-}
-
-int NullMux::detachOutStream() {
-    if (outStream()) outStream()->setParam(qvSinkDoNothing, 0);
-    return BaseMuxer::detachOutStream();
+        OwnFilesMuxer::getParam(name, value);
 }
 
 QvBufStream* NullMux::addStream(int type, const AnyDict& params) {

@@ -1,15 +1,12 @@
 // NullMux: swallows everything; for analysis passes. Module "nullmux".
 #pragma once
 
-#include "core/encode/basemuxer.h"
+#include "builtin/muxers/ownfilesmuxer.h"
 
-class NullMux : public BaseMuxer {
+class NullMux : public OwnFilesMuxer {
   public:
     void getParam(const char* name, Any& value) const override;
     using QvCodec::getParam;
-    // The sink has nothing to write; it is told so.
-    int attachOutStream(QvBufStream* stream) override;
-    int detachOutStream() override;
     QvBufStream* addStream(int type, const AnyDict& params) override;
     int open() override;
     int close() override;

@@ -8,10 +8,10 @@
 #include "builtin/encoders/rawoutput.h"
 #include "builtin/muxers/rawmuxoutput.h"
 #include "builtin/muxers/streamcodec.h"
-#include "builtin/sinks/qvfilebuiltins.h"
 #include "core/engine/qvfileutil.h"
 #include "core/media/fourcc.h"
 #include "core/stream/qvbufstreamsplit.h"
+#include "core/stream/qvfilebufstream.h"
 #include "core/value/qvassert.h"
 
 namespace {
@@ -23,17 +23,6 @@ constexpr char nameMissing[] = "[rawmux] Output filename not set";
 RawMux::RawMux() = default;
 
 RawMux::~RawMux() { finish(1); }
-
-int RawMux::attachOutStream(QvBufStream* stream) {
-    if (const int result = BaseMuxer::attachOutStream(stream)) return result;
-    stream->setParam(qvSinkDoNothing, 1);
-    return QvStatus::ok;
-}
-
-int RawMux::detachOutStream() {
-    if (outStream()) outStream()->setParam(qvSinkDoNothing, 0);
-    return BaseMuxer::detachOutStream();
-}
 
 QvBufStream* RawMux::addStream(int type, const AnyDict& params) {
     std::unique_ptr<QvBufStream> made;

@@ -4,7 +4,7 @@
 #include <memory>
 #include <vector>
 
-#include "core/encode/basemuxer.h"
+#include "builtin/muxers/ownfilesmuxer.h"
 
 // Names: the output's name without its extension, "#00" and so on (the number within the type) when there are
 // several streams of any type, and the extension of the encoder. "a.mpg" with one video and two audio streams
@@ -19,7 +19,7 @@
 //   "filenames"      vector  read only: the names of all streams, enabled or not
 //   "filesWritten"   vector  read only: every file that the last run made, pictures and channels one by one.
 //                            After close with status 0 they are complete; otherwise they are what is left.
-class RawMux : public BaseMuxer {
+class RawMux : public OwnFilesMuxer {
   public:
     RawMux();
     ~RawMux() override;
@@ -30,9 +30,6 @@ class RawMux : public BaseMuxer {
     void store(AnyDict& state) const override;
     int restore(const AnyDict& state) override;
 
-    // The sink has nothing to write; it is told so.
-    int attachOutStream(QvBufStream* stream) override;
-    int detachOutStream() override;
     QvBufStream* addStream(int type, const AnyDict& params) override;
     // Opens the files of all enabled streams. When one fails, all are closed again.
     int open() override;

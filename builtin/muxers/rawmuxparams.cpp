@@ -46,11 +46,11 @@ struct RawMuxParams {
 int RawMux::setParam(const char* name, const Any& value) {
     QV_ASSERT_MSG(getState() != qvStateOpen, "[RawMux] Invalid state");
     if (auto result = _setRow(RawMuxParams::rows(), *this, name, value)) return *result;
-    return BaseMuxer::setParam(name, value);
+    return OwnFilesMuxer::setParam(name, value);
 }
 
 void RawMux::getParam(const char* name, Any& value) const {
-    if (!qvGetParamRow(RawMuxParams::rows(), *this, name, value)) BaseMuxer::getParam(name, value);
+    if (!qvGetParamRow(RawMuxParams::rows(), *this, name, value)) OwnFilesMuxer::getParam(name, value);
 }
 
 void RawMux::store(AnyDict& state) const {

@@ -1,20 +1,8 @@
 #include "builtin/sinks/memsink.h"
 
 #include "builtin/creators.h"
-#include "core/engine/params.h"
-#include "core/media/qvgeometry.h"
 
 MemSink::~MemSink() { stream_.destroy(1); }
-
-// A file sink can be exchanged for this one, so its parameters are taken.
-int MemSink::setParam(const char* name, const Any& value) {
-    static constexpr QvParamRow<MemSink> rows[] = {
-        {"filename", {}, qvParamIgnored},
-        {"bufsize", {}, qvParamIgnored},
-    };
-    if (auto result = _setRow<MemSink>(rows, *this, name, value)) return *result;
-    return QvSink::setParam(name, value);
-}
 
 int MemSink::open() {
     if (getState() == stateCreated || running_)
@@ -37,7 +25,7 @@ QvBufStream* MemSink::stream() const { return &stream_; }
 
 void* MemSink::getInterface(int kind) const {
     if (kind == qvOutputQueueInterface) return static_cast<QvAuQueuePoll*>(&queue_);
-    return QvSink::getInterface(kind);
+    return FilelessSink::getInterface(kind);
 }
 
 QvCodec* newMemsink() { return new MemSink; }

@@ -1,18 +1,17 @@
 // MemSink: an output that ends in a queue of access units, which an application polls. Module "memsink".
 #pragma once
 
-#include "core/encode/qvsink.h"
+#include "builtin/sinks/filelesssink.h"
 #include "core/engine/qvmodule.h"
 #include "core/stream/qvbufmem.h"
 
 // getInterface(qvOutputQueueInterface) answers the QvAuQueuePoll. The queue lives as long as the sink, so
 // what was encoded can still be fetched after close. Any thread may poll while another encodes.
-class MemSink : public QvSink {
+class MemSink : public FilelessSink {
   public:
     MemSink() = default;
     ~MemSink() override;
 
-    int setParam(const char* name, const Any& value) override;
     // QvStatus::illegalState while it is open.
     int open() override;
     // The state stays; the sink can be opened again.

@@ -127,16 +127,6 @@ QvBufStream* FileSink::stream() const {
 
 NullSink::~NullSink() { stream_.destroy(1); }
 
-// A file sink can be exchanged for this one, so its parameters are taken.
-int NullSink::setParam(const char* name, const Any& value) {
-    static constexpr QvParamRow<NullSink> rows[] = {
-        {"filename", {}, qvParamIgnored},
-        {"bufsize", {}, qvParamIgnored},
-    };
-    if (auto result = _setRow<NullSink>(rows, *this, name, value)) return *result;
-    return QvSink::setParam(name, value);
-}
-
 int NullSink::open() {
     QV_ASSERT_MSG(getState() != stateCreated, "not inited");
     stream_.setParam("size", bufsize_);

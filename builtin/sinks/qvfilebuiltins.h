@@ -1,7 +1,7 @@
 // FileSink and NullSink: the ends of an output on a file and nowhere. Modules "filesink", "nullsink".
 #pragma once
 
-#include "core/encode/qvsink.h"
+#include "builtin/sinks/filelesssink.h"
 #include "core/engine/qvmodule.h"
 #include "core/stream/qvfilebufstream.h"
 
@@ -44,12 +44,11 @@ class FileSink : public QvSink {
 };
 
 // Swallows everything.
-class NullSink : public QvSink {
+class NullSink : public FilelessSink {
   public:
     NullSink() = default;
     ~NullSink() override;
 
-    int setParam(const char* name, const Any& value) override;
     int open() override;
     int close() override;
     QvBufStream* stream() const override;

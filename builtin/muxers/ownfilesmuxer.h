@@ -1,0 +1,11 @@
+// A multiplexer that puts nothing into its sink, since it writes files of its own, or none.
+#pragma once
+
+#include "core/encode/basemuxer.h"
+
+// As long as a sink is attached, it is told that it has nothing to write.
+class OwnFilesMuxer : public BaseMuxer {
+  public:
+    int attachOutStream(QvBufStream* stream) override;
+    int detachOutStream() override;
+};
