@@ -42,7 +42,8 @@ class QV_API QvTranscoder {
     QvTranscoder(const QvTranscoder& other);
     QvTranscoder& operator=(const QvTranscoder& other);
 
-    // Stops a run that is going on, waits for it, and drops the links.
+    // Stops a run that is going on and waits for it. By then the callbacks of a derived class are gone: its
+    // own destructor calls stop() first. Never from a callback.
     virtual ~QvTranscoder();
 
     // Runs `task` in place of the current one, which comes back when the run is over.
@@ -51,8 +52,8 @@ class QV_API QvTranscoder {
     // started. QvStatus::warning (-16): legal with a warning, and the run went on; QvStatus::notLegal (-11)
     // and other failures: errorDesc() has the text and nothing was written.
     virtual int transcode(bool synchronous);
-    // Ends a run and waits until it has ended. From a callback of a synchronous run, return non-zero from
-    // cbProcess instead. Always 0.
+    // Ends a run and waits until it has ended; from any thread. From a callback it asks for the end alone.
+    // Always 0.
     virtual int stop();
     // Holds and resumes an asynchronous run between two steps; asserts in a synchronous one.
     virtual int pause();
@@ -69,7 +70,9 @@ class QV_API QvTranscoder {
     virtual void getParam(const char* name, Any& value) const;
 
     // Callbacks, all on the thread that runs the job. `result` is 0, 1 for a stopped run, the error of the
-    // run, or the exit code of the post-process command.
+    // run (QvStatus::endOfStream, -4: the coded picture ended early and the output was closed all the same),
+    // or the exit code of the post-process command. cbDone may start the next run. What a callback throws
+    // ends the run as a failure.
     virtual void cbDone(int result);
     virtual int cbProgress(double part);  // 0 to 1; over both passes of a two-pass run
     virtual void cbPaused(bool paused);

@@ -8,6 +8,7 @@
 #include "tests/support/fake_filters.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/platform_scope.h"
+#include "tests/support/temp_folder.h"
 
 namespace {
 
@@ -237,6 +238,21 @@ TEST_F(Transcoder, Parameters) {
     EXPECT_TRUE(get("secondPass").isTrue());
     for (const char* name : {"deadLock", "srPossible", "writeLogfile"})
         EXPECT_TRUE(get(name).isFalse()) << name;
+}
+
+TEST_F(Transcoder, ALogFileHoldsTheMessagesOfTheRunAlone) {
+    TempFolder folder;
+    Job job;
+    job.linkBoth();
+    job.pipe.filename = folder.file("x.raw").c_str();
+    NotedTranscoder t(job.events, &job.task);
+    t.setParam("writeLogfile", 1);
+    t.onProcess = [] { return qv_log()->info("half way"), 0; };
+    EXPECT_EQ(t.transcode(true), 0);
+    qv_log()->info("over");
+    const std::string text = TempFolder::read(folder.file("x.raw.log"));
+    EXPECT_NE(text.find("half way"), std::string::npos);
+    EXPECT_EQ(text.find("over"), std::string::npos);
 }
 
 TEST_F(Transcoder, AFullDiscIsLoggedAndEndsOnlyARunThatWatchesIt) {
