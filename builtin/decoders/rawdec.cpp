@@ -19,6 +19,7 @@ using Settings = RawDecoder::Settings;
 
 constexpr std::size_t readAhead = 4096;
 constexpr unsigned deliveredForV210 = QvFourcc::Y216;
+constexpr int leastForV210 = 4;  // pixels either way; the converter makes smaller pictures black
 
 int setFramerate(Settings& settings, const Any& value) {
     if (value.isFramerate()) {
@@ -158,6 +159,8 @@ int RawDecoder::checkFields() {
 int RawDecoder::makeConverter() {
     converter_.reset();
     if (fileFormat_ != FileFormat::v210) return QvStatus::ok;
+    if (settings_.width < leastForV210 || settings_.height < leastForV210)
+        return setError(QvStatus::failed, "Invalid frame size %dx%d", settings_.width, settings_.height);
     std::unique_ptr<QvCodec> converter(qv_registry()->newCodec("colorconv"));
     if (!converter || !converter->getInterface(QvModuleType::videoFilter))
         return setError(QvStatus::failed, "media dec: no converter for v210");

@@ -149,6 +149,7 @@ int QvFrame::interlace(const QvFrame& first, const QvFrame& second) {
                            ? takeFormat(first.four_cc(), first.width(), 2 * first.height())
                            : QvStatus::outOfMemory;
     if (status != QvStatus::ok) destroy();
+    if (inited_ && first.height() == 1) setBlack();  // fields of one row bring no chroma
     for (int p = 0; p < planes_; ++p) {
         const int rows = first.height(p);
         copyPlaneRows(*this, first, p, rows, {.dstStep = 2});

@@ -7,12 +7,11 @@
 namespace {
 
 TEST(QvBitrate, ComparesWhatItsTypeUses) {
-    struct Case {
+    using B = QvBitrate;
+    const struct {
         QvBitrate a, b;
         bool equal;
-    };
-    using B = QvBitrate;
-    const Case cases[] = {
+    } cases[] = {
         {B(B::cbr, 5, 1, 1, 1), B(B::cbr, 5, 2, 2, 2), true},
         {B(B::cbr, 5), B(B::cbr, 6), false},
         {B(B::vbr, 5, 1, 2, 3), B(B::vbr, 6, 1, 2, 3), true},  // targets are not compared
@@ -29,11 +28,10 @@ TEST(QvBitrate, ComparesWhatItsTypeUses) {
 }
 
 TEST(QvBitrate, DescribesItself) {
-    struct Case {
+    const struct {
         QvBitrate rate;
         const char* text;
-    };
-    const Case cases[] = {
+    } cases[] = {
         {QvBitrate(0, 4999), "CBR, 4kbps"},
         {QvBitrate(1, 4000000, 0, 8000000, 255), "VBR, 4000kbps (max N/A)"},
         {QvBitrate(1, 4000000, 0, 8000000), "VBR, 4000kbps (max 8000kbps)"},

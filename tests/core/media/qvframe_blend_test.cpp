@@ -16,26 +16,8 @@ namespace {
 
 using namespace QvFourcc;
 
-int pixelBytesOf(unsigned fourcc) {
-    switch (fourcc) {
-        case BGR3: return 3;
-        case BGR4:
-        case BGRA:
-        case ARGB:
-        case R32C:
-        case Y216: return 4;
-        case b64a: return 8;
-        case YUY2:
-        case YUYV:
-        case UYVY:
-        case R555:
-        case R565:
-        case W016: return 2;
-        default: return 1;
-    }
-}
-
-bool wordsOf(unsigned fourcc) { return fourcc == b64a || fourcc == Y216 || fourcc == W016; }
+int pixelBytesOf(unsigned fourcc) { return qvPixelFormat(fourcc)->pixelBytes; }
+bool wordsOf(unsigned fourcc) { return QvFrame::bitDepth(fourcc) == 16; }
 
 struct Weights {
     FrameModel* mask = nullptr;
@@ -67,13 +49,11 @@ FrameModel blended(FrameModel dst, FrameModel src, int x, int y, const Weights& 
         const int half = p ? 2 : 1;
         for (int row = 0; row < height / half; ++row)
             for (int column = 0; column < width / half; ++column) {
-                int maskValue = 0;
-                if (weights.mask) {
-                    if (p && weights.chroma)
-                        maskValue = weights.chroma->at(0, sy / 2 + row, sx / 2 + column);
-                    else
-                        maskValue = weights.mask->at(0, sy + half * row, sx + half * column);
-                }
+                const bool own = p && weights.chroma;
+                FrameModel* const mask = own ? weights.chroma : weights.mask;
+                const int maskValue = !mask ? 0
+                                      : own ? mask->at(0, sy / 2 + row, sx / 2 + column)
+                                            : mask->at(0, sy + half * row, sx + half * column);
                 for (int i = 0; i < bytes; i += unit) {
                     const int to = (dx / half + column) * bytes + i, from = (sx / half + column) * bytes + i;
                     const int toRow = dy / half + row, fromRow = sy / half + row;

@@ -17,14 +17,13 @@ namespace {
 using namespace QvFourcc;
 
 TEST(QvFrame, LaysOutEveryFormat) {
-    struct Case {
+    const struct {
         const char* code;
         int width, height;
         int stride0, stride1;
         int bytes0, bytes1;
         int planes, bits, depth;
-    };
-    const Case cases[] = {
+    } cases[] = {
         {"GRAY", 7, 5, 8, 0, 40, 0, 1, 8, 8},       {"I420", 7, 5, 7, 3, 35, 7, 3, 12, 8},
         {"YV12", 8, 6, 8, 4, 48, 12, 3, 12, 8},     {"I422", 7, 5, 7, 3, 35, 15, 3, 16, 8},
         {"W016", 7, 5, 14, 7, 70, 17, 3, 24, 16},   {"YUY2", 7, 5, 14, 0, 70, 0, 1, 16, 8},

@@ -10,16 +10,15 @@
 namespace {
 
 TEST(QvFramerate, NamesAreTheirRates) {
-    struct Named {
+    using R = QvFramerate;
+    const struct {
         const QvFramerate& (*constant)();
         void (QvFramerate::*set)();
         bool (QvFramerate::*is)() const;
         QvRatio rate;
         int interlaced;
         const char* text;
-    };
-    using R = QvFramerate;
-    const Named names[] = {
+    } names[] = {
         {R::f23p, &R::set23p, &R::is23p, {24000, 1001}, 0, "23.98p"},
         {R::f24p, &R::set24p, &R::is24p, {24, 1}, 0, "24p"},
         {R::f25p, &R::set25p, &R::is25p, {25, 1}, 0, "25p"},
@@ -86,12 +85,11 @@ TEST(QvFramerate, DominanceAndDisplayRate) {
 }
 
 TEST(QvFramerate, DescribesItself) {
-    struct Case {
+    const struct {
         QvFramerate rate;
         bool df, pulldown;
         const char* text;
-    };
-    const Case cases[] = {
+    } cases[] = {
         {QvFramerate(QvRatio(24000, 1001), 0, false, 1), true, true, "23.98p -> 59.94i PD"},
         {QvFramerate(QvRatio(24000, 1001), 0, false, 3), true, true, "23.98p -> 59.94i PD(A)"},
         {QvFramerate(QvRatio(24000, 1001), 0, false, 3), true, false, "23.98p"},
@@ -112,12 +110,11 @@ TEST(QvFramerate, IsFoundInAVector) {
     const AnyVector rates(Any("25"), Any(QvFramerate(25.0, 2, false, 1)), Any(QvFramerate(25.0, 1, true, 3)),
                           Any(QvFramerate(29.97, 0, true)), Any(QvFramerate(29.97)),
                           Any(QvFramerate(25.0, 0, true)));
-    struct Case {
+    const struct {
         QvFramerate rate;
         bool exact, df;
         int index;
-    };
-    const Case cases[] = {
+    } cases[] = {
         {QvFramerate(25.0, 1, false, 2), false, false, 1},  // kinds of interlace and pulldown
         {QvFramerate(25.0, 1, false, 2), true, false, -1},
         {QvFramerate(25.0, 1, false, 3), false, false, 2},  // the advanced kind is alone

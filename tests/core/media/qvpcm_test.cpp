@@ -4,12 +4,11 @@
 
 #include <climits>
 #include <cstring>
-#include <string>
 #include <vector>
 
-#include "core/engine/qvexception.h"
 #include "core/engine/status.h"
 #include "core/value/anycontainer.h"
+#include "tests/core/value/value_support.h"
 #include "tests/support/log_capture.h"
 
 namespace {
@@ -26,16 +25,6 @@ Bytes contents(const QvPcm& pcm) {
     return pcm.size() ? Bytes(pcm.ptr(0), pcm.ptr(0) + pcm.bytes()) : Bytes();
 }
 
-template <class Call>
-std::string failureOf(Call call) {
-    try {
-        call();
-    } catch (const QvAssertFailure& failure) {
-        return failure.what();
-    }
-    return "none";
-}
-
 TEST(QvPcm, GrowsByWhatIsMissing) {
     QvPcm pcm;
     ASSERT_EQ(pcm.init(3, 2, 2, 48000), 0);
@@ -50,19 +39,17 @@ TEST(QvPcm, GrowsByWhatIsMissing) {
     EXPECT_EQ(pcm.grow(2), 9);
     EXPECT_EQ(pcm.samples(), 4);
     EXPECT_EQ(pcm.erase(4), 0);
-    EXPECT_EQ(pcm.samples(), 0);
     EXPECT_EQ(pcm.erase(100), 0);
-    EXPECT_EQ(pcm.sizeBytes(), 36);
+    EXPECT_TRUE(pcm.samples() == 0 && pcm.sizeBytes() == 36);
     EXPECT_EQ(pcm.grow(-20), QvStatus::outOfMemory);
 }
 
 TEST(QvPcm, AppendsFromItself) {
     QvPcm pcm;
     pcm.init(4, 1, 1, 8000);
-    const Bytes data = ramp(4);
-    pcm.write(4, data.data());
+    pcm.write(4, ramp(4).data());
     for (int i = 0; i < 10; ++i) ASSERT_EQ(pcm.write(pcm.samples(), pcm.ptr(0)), 0);
-    for (int i = 0; i < pcm.samples(); ++i) ASSERT_EQ(*pcm.ptr(i), data[static_cast<std::size_t>(i % 4)]);
+    for (int i = 0; i < pcm.samples(); ++i) ASSERT_EQ(*pcm.ptr(i), ramp(4)[static_cast<std::size_t>(i % 4)]);
 }
 
 TEST(QvPcm, SilenceDependsOnTheWidth) {
@@ -174,11 +161,11 @@ TEST(QvPcm, CopiesMetaOnly) {
 TEST(QvPcm, FailuresAreAssertionsOrStatuses) {
     QvPcm pcm;
     constexpr char notInited[] = "QvPcm not inited", invalid[] = "Invalid sample";
-    EXPECT_NE(failureOf([&] { pcm.ptr(0); }).find(notInited), std::string::npos);
-    EXPECT_NE(failureOf([&] { pcm.clear(); }).find(notInited), std::string::npos);
-    EXPECT_NE(failureOf([&] { pcm.bytes(); }).find(notInited), std::string::npos);
-    EXPECT_NE(failureOf([&] { pcm.write(0, nullptr); }).find(notInited), std::string::npos);
-    EXPECT_NE(failureOf([&] { pcm.ms2samples(1, 1); }).find(notInited), std::string::npos);
+    EXPECT_EQ(failureOf([&] { pcm.ptr(0); }), notInited);
+    EXPECT_EQ(failureOf([&] { pcm.clear(); }), notInited);
+    EXPECT_EQ(failureOf([&] { pcm.bytes(); }), notInited);
+    EXPECT_EQ(failureOf([&] { pcm.write(0, nullptr); }), notInited);
+    EXPECT_EQ(failureOf([&] { pcm.ms2samples(1, 1); }), notInited);
 
     const struct {
         int size, channels, width;
@@ -188,12 +175,11 @@ TEST(QvPcm, FailuresAreAssertionsOrStatuses) {
         EXPECT_FALSE(pcm.inited());
     }
     pcm.init(2, 1, 2, 48000);
-    for (int sample : {-1, 2, INT_MAX})
-        EXPECT_NE(failureOf([&] { pcm.ptr(sample); }).find(invalid), std::string::npos);
+    for (int sample : {-1, 2, INT_MAX}) EXPECT_EQ(failureOf([&] { pcm.ptr(sample); }), invalid);
     EXPECT_THROW(pcm.setSamples(3), QvAssertFailure);
     pcm.setSamples(2);
     // Nothing into a full buffer asks for the address behind its last sample.
-    EXPECT_NE(failureOf([&] { pcm.write(0, pcm.ptr(0)); }).find(invalid), std::string::npos);
+    EXPECT_EQ(failureOf([&] { pcm.write(0, pcm.ptr(0)); }), invalid);
     LogCapture log;
     EXPECT_EQ(pcm.write(INT_MAX, pcm.ptr(0)), QvStatus::outOfMemory);
     EXPECT_TRUE(log.contains("[QvPcm] Out of memory"));

@@ -85,12 +85,11 @@ TEST(QvTimecode, SecondsUseTheDisplayRate) {
 }
 
 TEST(QvTimecode, ReadsFourPartsOrNone) {
-    struct Case {
+    const struct {
         const char* in;
         const char* out;
         bool df;
-    };
-    const Case cases[] = {
+    } cases[] = {
         {"01;02:03:04", "01:02:03:04", true},
         {"01:02:03:04", "01:02:03:04", false},
         {"01:02:03", "00:00:00:00", false},

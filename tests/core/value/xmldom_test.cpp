@@ -174,7 +174,7 @@ TEST(XmlParser, damagedDocumentsTellReasonAndLine) {
          "attribute defaults too large at line 1"},
         {"<r>\n" + repeated("<gen>40000000x 00 </gen>\n", 3) + "</r>", "binary data too large at line 3"},
     };
-    for (const Case& c : cases) EXPECT_EQ(parseFailure(c.document), c.failure) << c.document.substr(0, 60);
+    for (const auto& c : cases) EXPECT_EQ(parseFailure(c.document), c.failure) << c.document.substr(0, 60);
 
     XmlParser parser;
     try {

@@ -51,11 +51,10 @@ Restored restored(const std::string& document) {
 }
 
 TEST(XmlTrans, dataOfEachType) {
-    struct Case {
+    const struct {
         Any value;
         const char *element, *data;
-    };
-    const Case cases[] = {
+    } cases[] = {
         {Any(), "inv", ""},
         {Any(std::numeric_limits<int>::min()), "i32", "-2147483648"},
         {Any(std::numeric_limits<long long>::min()), "i64", "-9223372036854775808"},
@@ -69,7 +68,7 @@ TEST(XmlTrans, dataOfEachType) {
         {bytes("\x05\x05\x06\x06\x06\xFF"), "gen", "05 05 3x 06 FF "},
         {Any(static_cast<const void*>("borrowed")), "gen", ""},
     };
-    for (const Case& c : cases) {
+    for (const auto& c : cases) {
         const auto node = nodeOf(c.value);
         EXPECT_STREQ(node->name(), c.element);
         EXPECT_EQ(std::string(node->data()), c.data);
@@ -78,12 +77,11 @@ TEST(XmlTrans, dataOfEachType) {
 }
 
 TEST(XmlTrans, attributesOfEachType) {
-    struct Case {
+    const struct {
         Any value;
         const char* element;
         AnyDict attributes;
-    };
-    const Case cases[] = {
+    } cases[] = {
         {QvFramerate(QvRatio(30000, 1001), 2, true, 3), "framerate",
          AnyDict("num", "30000", "denom", "1001", "df", "1", "interlaced", "2", "pulldown", "3")},
         {QvPoint(-1, 2), "pt", AnyDict("x", "-1", "y", "2")},
@@ -95,7 +93,7 @@ TEST(XmlTrans, attributesOfEachType) {
         {Pair(-5, 6), "pair", AnyDict("first", "-5", "second", "6")},
         {MediaTime(1LL << 60, 90000), "mediatime", AnyDict("ticks", "1152921504606846976", "scale", "90000")},
     };
-    for (const Case& c : cases) {
+    for (const auto& c : cases) {
         const auto node = nodeOf(c.value);
         EXPECT_STREQ(node->name(), c.element);
         EXPECT_EQ(node->attrs(), c.attributes) << c.element;
@@ -108,11 +106,10 @@ TEST(XmlTrans, attributesOfEachType) {
 TEST(XmlTrans, readsDamagedValues) {
     constexpr int max32 = std::numeric_limits<int>::max();
     constexpr double infinity = std::numeric_limits<double>::infinity();
-    struct Case {
+    const struct {
         const char* element;
         Any value;
-    };
-    const Case cases[] = {
+    } cases[] = {
         {"<i32> \n\t+12 apples</i32>", Any(12)},
         {"<i32>-</i32>", Any(0)},
         {"<i32>+-3</i32>", Any(0)},
@@ -158,7 +155,7 @@ TEST(XmlTrans, readsDamagedValues) {
          "<ent><key>c</key></ent><ent><key>d</key><val/></ent></dict>",
          AnyDict("a", 1, "b", 2)},
     };
-    for (const Case& c : cases) EXPECT_EQ(valueOf(c.element), c.value) << c.element;
+    for (const auto& c : cases) EXPECT_EQ(valueOf(c.element), c.value) << c.element;
     EXPECT_TRUE(std::isnan(valueOf("<fl>NaN</fl>").asFloat()));
     EXPECT_EQ(valueOf("<framerate num='50' df='1'/>").asFramerate().df(), true);
 }
@@ -172,11 +169,10 @@ TEST(XmlTrans, missingPartsOfARateAreLogged) {
 }
 
 TEST(XmlTrans, placeOfTheClass) {
-    struct Case {
+    const struct {
         AnyDict dict;
         const char *given, *name, *attribute;
-    };
-    const Case cases[] = {
+    } cases[] = {
         {AnyDict("__class__", "Foo"), nullptr, "Foo", nullptr},
         {AnyDict("__class__", "Foo"), "Foo", "Foo", nullptr},
         {AnyDict("__class__", "Foo"), "Bar", "Bar", "Foo"},
@@ -184,7 +180,7 @@ TEST(XmlTrans, placeOfTheClass) {
         {AnyDict("__class__", "a b"), nullptr, "dict", "a b"},
         {AnyDict("#c", 1), nullptr, "dict", nullptr},
     };
-    for (const Case& c : cases) {
+    for (const auto& c : cases) {
         XmlNode node(c.given);
         XmlTrans().DictToXml(c.dict, &node);
         EXPECT_STREQ(node.name(), c.name);
@@ -302,13 +298,12 @@ TEST(XmlTrans, deepestDocument) {
 }
 
 TEST(StoreDict, classAndVersion) {
-    struct Case {
+    const struct {
         AnyDict dict;
         const char* className;
         Any version;
         std::string start;  // of the root element; empty: refused
-    };
-    const Case cases[] = {
+    } cases[] = {
         {AnyDict("a", 1), "C", Any(3), "<C version=\"3\">"},
         {AnyDict("a", 1), "C", Any(1LL << 40), "<C version=\"1099511627776\">"},
         {AnyDict("a", 1), "C", Any(1.5), "<C version=\"1.500000\">"},
@@ -321,7 +316,7 @@ TEST(StoreDict, classAndVersion) {
         {AnyDict("__class__", 5), nullptr, Any(), ""},
     };
     const TempFolder folder;
-    for (const Case& c : cases) {
+    for (const auto& c : cases) {
         const std::string file = folder.file("a.xml");
         const int result = XmlParser::storeDict(file.c_str(), c.dict, c.className, c.version);
         EXPECT_EQ(result, c.start.empty() ? -1 : 0) << c.start;
