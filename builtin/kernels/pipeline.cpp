@@ -35,9 +35,20 @@ bool fullRange(const Format& format, int plane) { return plane == 3 || format.fa
 template <class S>
 class Band {
   public:
-    Band(const Plan& plan, Lines<S>& lines, const Picture& source, const Picture& target, int field)
-        : plan_(plan), lines_(lines), source_(source), target_(target), field_(field) {
+    Band(const Plan& plan, Lines<S>& lines, const Picture& source, const Picture& target, int field,
+         int first, int last)
+        : plan_(plan),
+          lines_(lines),
+          source_(source),
+          target_(target),
+          field_(field),
+          first_(first),
+          last_(last) {
         lines_.forget();
+        const Group& luma = scaling(0).luma;
+        lumaInPlace_ = !deep && luma.copies() && luma.across.offset == 0 &&
+                       luma.across.source == plan.request.width && !hasMatrix() && !source.format->planar() &&
+                       target.format->planar();
     }
 
     void targetLine(int y) {
@@ -86,8 +97,17 @@ class Band {
         S* places[4];
         places[0] = sourcePlace(0, y, fresh);
         for (int p = 1; p < 4; ++p) places[p] = sourcePlace(p, y, ignored);
+        if constexpr (!deep)
+            if (S* target = targetLuma(y)) places[0] = target;
         if (fresh) unpack(y, places);
         return places[plane];
+    }
+
+    // The target's own line, if luma goes there as it is and the line is one of this band.
+    Byte* targetLuma(int y) const {
+        if (!lumaInPlace_) return nullptr;
+        const int line = y - scaling(0).luma.down.offset;
+        return line >= first_ && line < last_ ? lineOf(target_, 0, line) : nullptr;
     }
 
     void unpack(int y, S* const places[4]) {
@@ -159,7 +179,8 @@ class Band {
         const Group& group = scaling(stage).of(plane);
         const int width = group.across.target;
         if (group.empty() || group.copies()) {
-            std::memcpy(to, scaledLine(stage, plane, y), count(width) * sizeof(S));
+            const S* line = scaledLine(stage, plane, y);
+            if (line != to) std::memcpy(to, line, count(width) * sizeof(S));
             return;
         }
         if constexpr (!deep)
@@ -345,7 +366,8 @@ class Band {
     const Plan& plan_;
     Lines<S>& lines_;
     const Picture &source_, &target_;
-    const int field_;
+    const int field_, first_, last_;
+    bool lumaInPlace_ = false;  // unpacked straight into the target
 };
 
 // Lines as they stand, of every plane.
@@ -385,10 +407,10 @@ void runBand(const Plan& plan, Workspace& workspace, const Picture& source, cons
     if (plan.path.from == Core::lines) return copyLines(plan, from, to, first, last);
     if (plan.path.from == Core::packed8) return shuffleLines(plan, from, to, first, last);
     if (plan.deep) {
-        Band<uint16_t> band(plan, *workspace.words, from, to, field);
+        Band<uint16_t> band(plan, *workspace.words, from, to, field, first, last);
         for (int y = first; y < last; ++y) band.targetLine(y);
     } else {
-        Band<Byte> band(plan, *workspace.bytes, from, to, field);
+        Band<Byte> band(plan, *workspace.bytes, from, to, field, first, last);
         for (int y = first; y < last; ++y) band.targetLine(y);
     }
 }

@@ -15,7 +15,7 @@ HWY_BEFORE_NAMESPACE();
 namespace srk {
 namespace HWY_NAMESPACE {
 
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
 HWY_INLINE size_t lanes() { return hn::Lanes(d8); }
 HWY_INLINE V8 load(const Byte* from) { return hn::LoadU(d8, from); }
 HWY_INLINE void put(V8 v, Byte* to) { hn::StoreU(v, d8, to); }
@@ -25,7 +25,7 @@ HWY_INLINE Byte clampByte(int value) { return static_cast<Byte>(std::clamp(value
 
 void split4(const Byte* from, Byte* a, Byte* b, Byte* c, Byte* d, size_t n) {
     size_t i = 0;
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
     for (; i + lanes() <= n; i += lanes()) {
         V8 va, vb, vc, vd;
         hn::LoadInterleaved4(d8, from + 4 * i, va, vb, vc, vd);
@@ -45,7 +45,7 @@ void split4(const Byte* from, Byte* a, Byte* b, Byte* c, Byte* d, size_t n) {
 
 void join4(Byte* to, const Byte* a, const Byte* b, const Byte* c, const Byte* d, size_t n) {
     size_t i = 0;
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
     for (; i + lanes() <= n; i += lanes())
         hn::StoreInterleaved4(load(a + i), load(b + i), load(c + i), d ? load(d + i) : hn::Set(d8, 255), d8,
                               to + 4 * i);
@@ -60,7 +60,7 @@ void join4(Byte* to, const Byte* a, const Byte* b, const Byte* c, const Byte* d,
 
 void split3(const Byte* from, Byte* a, Byte* b, Byte* c, size_t n) {
     size_t i = 0;
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
     for (; i + lanes() <= n; i += lanes()) {
         V8 va, vb, vc;
         hn::LoadInterleaved3(d8, from + 3 * i, va, vb, vc);
@@ -78,7 +78,7 @@ void split3(const Byte* from, Byte* a, Byte* b, Byte* c, size_t n) {
 
 void join3(Byte* to, const Byte* a, const Byte* b, const Byte* c, size_t n) {
     size_t i = 0;
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
     for (; i + lanes() <= n; i += lanes())
         hn::StoreInterleaved3(load(a + i), load(b + i), load(c + i), d8, to + 3 * i);
 #endif
@@ -91,7 +91,7 @@ void join3(Byte* to, const Byte* a, const Byte* b, const Byte* c, size_t n) {
 
 // Pixels of three bytes are moved in blocks of 16 bytes, of which 12 count; what lies behind them is written
 // next, so all but the last blocks of a line go this way.
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
 const hn::Full128<uint8_t> block8;
 alignas(16) constexpr Byte dropFourth[16] = {0, 1, 2, 4, 5, 6, 8, 9, 10, 12, 13, 14, 255, 255, 255, 255};
 alignas(16) constexpr Byte spreadThree[16] = {0, 1, 2, 255, 3, 4, 5, 255, 6, 7, 8, 255, 9, 10, 11, 255};
@@ -102,7 +102,7 @@ alignas(16) constexpr Byte fourth[16] = {0, 0, 0, 255, 0, 0, 0, 255, 0, 0, 0, 25
 // target is behind the source.
 void pack4to3(Byte* to, const Byte* from, size_t n) {
     size_t i = 0;
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
     const auto order = hn::Load(block8, dropFourth);
     for (; i + 6 <= n; i += 4)
         hn::StoreU(hn::TableLookupBytesOr0(hn::LoadU(block8, from + 4 * i), order), block8, to + 3 * i);
@@ -117,7 +117,7 @@ void pack4to3(Byte* to, const Byte* from, size_t n) {
 
 void pack3to4(Byte* to, const Byte* from, size_t n) {
     size_t i = 0;
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
     const auto order = hn::Load(block8, spreadThree), opaque = hn::Load(block8, fourth);
     for (; i + 6 <= n; i += 4)
         hn::StoreU(hn::Or(hn::TableLookupBytesOr0(hn::LoadU(block8, from + 3 * i), order), opaque), block8,
@@ -131,7 +131,7 @@ void pack3to4(Byte* to, const Byte* from, size_t n) {
 
 void reverse4(Byte* to, const Byte* from, size_t n) {
     size_t i = 0;
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
     const hn::Repartition<uint32_t, D8> du32;
     for (; i + lanes() / 4 <= n; i += lanes() / 4) {
         const auto pixel = hn::BitCast(du32, load(from + 4 * i));
@@ -148,7 +148,7 @@ void reverse4(Byte* to, const Byte* from, size_t n) {
 void splitYuyv(const Byte* from, Byte* y, Byte* u, Byte* v, size_t n, bool lumaFirst) {
     const size_t pairs = n / 2, at = lumaFirst ? 0 : 1;
     size_t i = 0;
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
     for (; i + lanes() <= pairs; i += lanes()) {
         const auto a = load(from + 4 * i), b = load(from + 4 * i + lanes());
         const auto c = load(from + 4 * i + 2 * lanes()), d = load(from + 4 * i + 3 * lanes());
@@ -173,7 +173,7 @@ void splitYuyv(const Byte* from, Byte* y, Byte* u, Byte* v, size_t n, bool lumaF
 void joinYuyv(Byte* to, const Byte* y, const Byte* u, const Byte* v, size_t n, bool lumaFirst) {
     const size_t pairs = n / 2, at = lumaFirst ? 0 : 1;
     size_t i = 0;
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
     const hn::Half<D8> half;
     for (; i + lanes() / 2 <= pairs; i += lanes() / 2) {
         // Words of U below V, then bytes of luma between.
@@ -201,7 +201,7 @@ void joinYuyv(Byte* to, const Byte* y, const Byte* u, const Byte* v, size_t n, b
     }
 }
 
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
 // Vectors of the rows: blue and red side by side, green beside nothing.
 struct YuvRow {
     V16 blueRed, green;
@@ -243,7 +243,7 @@ HWY_INLINE void yuvOne(const ToYuv& rows, const Byte* bgr, Byte* y, Byte* u, Byt
 
 void rgb4ToYuv(const ToYuv& rows, const Byte* from, Byte* y, Byte* u, Byte* v, size_t n) {
     size_t i = 0;
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
     const auto ry = rowOf(rows.y, rows.yAdd), ru = rowOf(rows.u, rows.chromaAdd),
                rv = rowOf(rows.v, rows.chromaAdd);
     const auto low = hn::Set(d16, 255);
@@ -275,7 +275,7 @@ void rgb4ToYuv(const ToYuv& rows, const Byte* from, Byte* y, Byte* u, Byte* v, s
 void rgbToYuv(const ToYuv& rows, const Byte* b, const Byte* g, const Byte* r, Byte* y, Byte* u, Byte* v,
               size_t n) {
     size_t i = 0;
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
     const auto ry = rowOf(rows.y, rows.yAdd), ru = rowOf(rows.u, rows.chromaAdd),
                rv = rowOf(rows.v, rows.chromaAdd);
     for (; i + lanes() <= n; i += lanes()) {
@@ -307,7 +307,7 @@ HWY_INLINE void rgbOne(const ToRgb& rows, int y, int u, int v, Byte* bgr) {
     bgr[2] = clampByte((luma + fixedProduct(cr, rows.crToR)) >> 5);
 }
 
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
 struct RgbConstants {
     V16 yOffset, y, cbToB, cbToG, crToG, crToR;
     explicit RgbConstants(const ToRgb& rows)
@@ -353,7 +353,7 @@ struct ToPlanes {
         g[i] = p[1];
         r[i] = p[2];
     }
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
     HWY_INLINE void all(size_t i, const Bytes3& p) const {
         put(p.b, b + i);
         put(p.g, g + i);
@@ -368,7 +368,7 @@ struct ToFours {
         std::memcpy(to + 4 * i, p, 3);
         to[4 * i + 3] = 255;
     }
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
     HWY_INLINE void all(size_t i, const Bytes3& p) const {
         hn::StoreInterleaved4(p.b, p.g, p.r, hn::Set(d8, 255), d8, to + 4 * i);
     }
@@ -378,7 +378,7 @@ struct ToFours {
 struct ToThrees {
     Byte* to;
     void one(size_t i, const Byte* p) const { std::memcpy(to + 3 * i, p, 3); }
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
     HWY_INLINE void all(size_t i, const Bytes3& p) const {
         hn::StoreInterleaved3(p.b, p.g, p.r, d8, to + 3 * i);
     }
@@ -389,7 +389,7 @@ template <class To>
 HWY_INLINE void eachRgb(const ToRgb& rows, const Byte* y, const Byte* u, const Byte* v, size_t n,
                         const To& to) {
     size_t i = 0;
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
     const RgbConstants k(rows);
     for (; i + lanes() <= n; i += lanes()) to.all(i, rgbBytes(k, load(y + i), load(u + i), load(v + i)));
 #endif
@@ -413,7 +413,7 @@ void yuvToRgb3(const ToRgb& rows, const Byte* y, const Byte* u, const Byte* v, B
     eachRgb(rows, y, u, v, n, ToThrees{to});
 }
 
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
 HWY_INLINE V16 otherWords(const int16_t m[3], V16 y, V16 u, V16 v, int centre) {
     // Pairs of Y U, and of V with the rounding.
     const auto one = hn::Set(d16, 1);
@@ -433,7 +433,7 @@ HWY_INLINE Byte otherOne(const int16_t m[3], int y, int u, int v, int centre) {
 
 void yuvToOther(const ToOther& rows, Byte* y, Byte* u, Byte* v, size_t n) {
     size_t i = 0;
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
     constexpr int zero[3] = {16, 128, 128};
     const auto black = hn::Set(d16, 16), centre = hn::Set(d16, 128);
     for (; i + lanes() <= n; i += lanes()) {
@@ -456,7 +456,7 @@ void yuvToOther(const ToOther& rows, Byte* y, Byte* u, Byte* v, size_t n) {
     }
 }
 
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
 // (x * scale + add) >> 14 on 16-bit lanes by 32-bit products.
 HWY_INLINE V16 scaledWords(V16 x, V16 factors) {
     const auto one = hn::Set(d16, 1);
@@ -468,7 +468,7 @@ HWY_INLINE V16 scaledWords(V16 x, V16 factors) {
 
 HWY_INLINE void levels(Byte* to, const Byte* from, size_t n, int scale, int before, int after) {
     size_t i = 0;
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
     const auto factors = pairOf(scale, 8192);
     const auto sub = hn::Set(d16, static_cast<int16_t>(before)),
                plus = hn::Set(d16, static_cast<int16_t>(after));
@@ -490,7 +490,7 @@ void toFullLevels(Byte* to, const Byte* from, size_t n) { levels(to, from, n, fu
 
 void widen(uint16_t* to, const Byte* from, size_t n, bool full) {
     size_t i = 0;
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
     const hn::Rebind<uint8_t, decltype(hn::Repartition<uint16_t, D8>())> half;
     const size_t step = lanes() / 2;
     for (; i + step <= n; i += step) {
@@ -504,7 +504,7 @@ void widen(uint16_t* to, const Byte* from, size_t n, bool full) {
 
 void narrow(Byte* to, const uint16_t* from, size_t n, bool full) {
     size_t i = 0;
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
     // round(x / 257) = (x + 128 - (x >> 8)) >> 8; both keep within 16 bits by adding with saturation.
     const auto half = hn::Set(du16, 128);
     const hn::Rebind<uint8_t, decltype(hn::Repartition<uint16_t, D8>())> bytes;
@@ -524,7 +524,7 @@ void narrow(Byte* to, const uint16_t* from, size_t n, bool full) {
 
 void twice(Byte* to, const Byte* from, size_t n) {
     size_t i = 0;
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
     for (; i + lanes() <= n; i += lanes()) {
         const auto x = load(from + i);
         hn::StoreInterleaved2(x, x, d8, to + 2 * i);
@@ -536,7 +536,7 @@ void twice(Byte* to, const Byte* from, size_t n) {
 void doubleLine(Byte* to, const Byte* from, size_t n) {
     const size_t samples = n / 2;
     size_t i = 0;
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
     for (; i + lanes() + 1 <= samples; i += lanes()) {
         const auto x = load(from + i);
         hn::StoreInterleaved2(x, hn::AverageRound(x, load(from + i + 1)), d8, to + 2 * i);
@@ -551,7 +551,7 @@ void doubleLine(Byte* to, const Byte* from, size_t n) {
 
 void quarterWay(Byte* to, const Byte* near, const Byte* far, size_t n) {
     size_t i = 0;
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
     const auto weights = hn::BitCast(di8, hn::Set(d16, 3 | 1 << 8));
     const auto two = hn::Set(d16, 2);
     for (; i + lanes() <= n; i += lanes()) {
@@ -566,7 +566,7 @@ void quarterWay(Byte* to, const Byte* near, const Byte* far, size_t n) {
 
 void halfWay(Byte* to, const Byte* near, const Byte* far, size_t n) {
     size_t i = 0;
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
     for (; i + lanes() <= n; i += lanes()) put(hn::AverageRound(load(near + i), load(far + i)), to + i);
 #endif
     for (; i < n; ++i) to[i] = static_cast<Byte>((near[i] + far[i] + 1) >> 1);

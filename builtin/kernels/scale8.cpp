@@ -21,7 +21,7 @@ HWY_INLINE size_t count(int n) { return static_cast<size_t>(n); }
 
 void copyAcross(const Byte* from, int16_t* to, int n) {
     int i = 0;
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
     const hn::Rebind<uint8_t, decltype(hn::Repartition<int16_t, D8>())> half;
     const int step = static_cast<int>(hn::Lanes(d16));
     for (; i + step <= n; i += step)
@@ -35,7 +35,7 @@ void copyAcross(const Byte* from, int16_t* to, int n) {
 // (32 a + 64 b + 32 c) for the samples around each second one.
 void halvesAcross(const Byte* from, int16_t* to, int n) {
     int i = 0;
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
     const int step = static_cast<int>(hn::Lanes(d16));
     const auto low = hn::Set(du16, 255);
     for (; i + step <= n; i += step) {
@@ -52,7 +52,7 @@ void halvesAcross(const Byte* from, int16_t* to, int n) {
     }
 }
 
-#if HWY_TARGET == HWY_SCALAR
+#if !QV_VECTORS
 
 // The tables are made for vectors that pick bytes.
 template <int windows>
@@ -130,7 +130,7 @@ void runsAcross(const Across& across, const Byte* from, int16_t* to) {
     for (int i = 0; i < across.target; ++i, weights += across.taps) {
         const Byte* base = from + across.base[count(i)];
         int sum = -bias, t = 0;
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
         const auto half = static_cast<int>(hn::Lanes(d8)), all = across.taps / half * half;
         if (all) {
             auto sums = hn::Zero(d32);
@@ -170,7 +170,7 @@ void scaleAcross(const Across& across, const Byte* from, int16_t* to) {
 // The bias of the words, taken out again, and half of the last place.
 constexpr int after = bias * unity + 8192;
 
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
 // Whole vectors: lines need no order across blocks.
 const hn::ScalableTag<int16_t> w16;
 using W16 = decltype(hn::ScalableTag<int16_t>());
@@ -210,7 +210,7 @@ template <int fixedTaps>
 void downOf(const int16_t* const* lines, const int16_t* weights, int anyTaps, Byte* to, int n) {
     const int taps = fixedTaps ? fixedTaps : anyTaps;
     int x = 0;
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
     const int step = static_cast<int>(hn::Lanes(w16));
     for (; x + step <= n; x += step) {
         auto low = hn::Set(w32, after), high = low;
@@ -230,7 +230,7 @@ template <int fixedTaps>
 void downBytesOf(const Byte* const* lines, const int8_t* weights, int anyTaps, Byte* to, int n) {
     const int half = (fixedTaps ? fixedTaps : anyTaps) / 2;
     int x = 0;
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
     const int step = static_cast<int>(hn::Lanes(d8));
     // Sums less 128 are signed bytes: one more than that is clamped as it should be.
     const auto start = hn::Set(d16, 64 - bias);
@@ -269,7 +269,7 @@ void scaleDownBytes(const Byte* const* lines, const int8_t* weights, int taps, B
 
 void downCopy(const int16_t* line, Byte* to, int n) {
     int x = 0;
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
     const hn::Rebind<uint8_t, decltype(hn::Repartition<int16_t, D8>())> bytes;
     const int step = static_cast<int>(hn::Lanes(d16));
     // (word + 16384 + 64) >> 7 without leaving 16 bits: 128 is put back after the shift.

@@ -7,12 +7,16 @@
 #define QV_KERNEL_VECTORS_INL
 #endif
 
+// Without a vector unit the plain loops do all of the work, and are what the units are compared with.
+#undef QV_VECTORS
+#define QV_VECTORS (HWY_TARGET != HWY_SCALAR && HWY_TARGET != HWY_EMU128)
+
 HWY_BEFORE_NAMESPACE();
 namespace srk {
 namespace HWY_NAMESPACE {
 namespace hn = hwy::HWY_NAMESPACE;
 
-#if HWY_TARGET != HWY_SCALAR
+#if QV_VECTORS
 
 // At most 32 bytes: wider vectors gain nothing here, and cost clock.
 const hn::CappedTag<uint8_t, 32> d8;

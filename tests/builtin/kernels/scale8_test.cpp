@@ -78,7 +78,7 @@ TEST(Scale8, UnitsGiveTheBytesOfThePlainLoops) {
         for (const auto filter : filters) {
             const Axis axis = makeAxis(geometry.mapping, geometry.source, geometry.target, filter, false);
             const Across table = makeAcross(axis);
-            const auto expected = across(table, line, HWY_SCALAR);
+            const auto expected = across(table, line, HWY_STATIC_TARGET);
             for (int i = 0; i < axis.target && !axis.copies; ++i) {
                 int sum = -16384;
                 for (int t = 0; t < axis.taps; ++t)

@@ -23,7 +23,7 @@ class OnTarget {
 // The units that this machine has and the kernels are compiled for, plain loops among them.
 inline std::vector<int64_t> machineTargets() {
     std::vector<int64_t> targets;
-    for (const int64_t target : {HWY_SCALAR, HWY_SSE4, HWY_AVX2, HWY_AVX3})
-        if (target == HWY_SCALAR || (hwy::SupportedTargets() & target)) targets.push_back(target);
+    for (const int64_t target : {HWY_STATIC_TARGET, HWY_SSE4, HWY_AVX2, HWY_AVX3})
+        if (target == HWY_STATIC_TARGET || (hwy::SupportedTargets() & target)) targets.push_back(target);
     return targets;
 }

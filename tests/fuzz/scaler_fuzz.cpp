@@ -1,0 +1,110 @@
+// Calls the picture scaler with any formats, sizes, strides, flags and rectangles. Both pictures stand in
+// memory of just the size that an accepted call may use, so that the sanitizer sees one byte too many.
+#include <cstdint>
+#include <cstdlib>
+#include <cstring>
+#include <memory>
+#include <vector>
+
+#include "builtin/kernels/formats.h"
+#include "core/filter/srscaler.h"
+#include "core/media/fourcc.h"
+
+namespace {
+
+class Input {
+  public:
+    Input(const uint8_t* data, size_t size) : data_(data), left_(size) {}
+    unsigned take(int bytes) {
+        unsigned value = 0;
+        for (; bytes > 0 && left_ > 0; --bytes, --left_) value = value << 8 | *data_++;
+        return value;
+    }
+    const uint8_t* rest() const { return data_; }
+    size_t left() const { return left_; }
+
+  private:
+    const uint8_t* data_;
+    size_t left_;
+};
+
+struct Given {
+    unsigned fourcc;
+    int width, height, stride;
+    std::vector<uint8_t> memory;
+};
+
+unsigned fourccOf(Input& input) {
+    const unsigned choice = input.take(1);
+    if (choice >= 250) return input.take(4);
+    if (choice >= 240) return qvFourcc("HDYC");
+    unsigned code = 0;
+    char name[5];
+    std::memcpy(name, srk::formats()[choice % srk::formatCount].name, 5);
+    if (name[2] == 'X') {
+        const unsigned bits = 9 + input.take(1) % 8;
+        name[2] = static_cast<char>('0' + bits / 10);
+        name[3] = static_cast<char>('0' + bits % 10);
+    }
+    std::memcpy(&code, name, 4);
+    return code;
+}
+
+// Memory for a picture whose lines stand as far apart as `stride` says; none for one that must be refused.
+size_t bytesOf(const Given& given) {
+    const int number = srk::formatNumber(given.fourcc);
+    if (number < 0 || given.width <= 0 || given.height <= 0) return 0;
+    srk::Picture picture;
+    picture.format = &srk::formats()[static_cast<size_t>(number & 0xffff)];
+    picture.width = given.width;
+    picture.height = given.height;
+    uint8_t byte = 0;
+    if (!srk::layOut(picture, &byte, given.stride)) return 0;
+    size_t bytes = 0;
+    for (int p = 0; p < picture.format->planes(); ++p) {
+        const int lines = picture.planeHeight(p);
+        const long long line = srk::lineBytes(*picture.format, picture.width, p);
+        if (lines == 0 || line == 0) continue;
+        const auto end =
+            picture.planes[p].data - &byte + std::llabs(picture.planes[p].stride) * (lines - 1) + line;
+        bytes = std::max(bytes, static_cast<size_t>(end));
+    }
+    return bytes;
+}
+
+Given givenOf(Input& input) {
+    Given given;
+    given.fourcc = fourccOf(input);
+    given.width = static_cast<int>(input.take(1)) - 2;
+    given.height = static_cast<int>(input.take(1)) % 80 - 2;
+    const unsigned stride = input.take(2);
+    given.stride = stride % 3 ? 0 : static_cast<int16_t>(stride);
+    return given;
+}
+
+}  // namespace
+
+extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
+    Input input(data, size);
+    Given source = givenOf(input), target = givenOf(input);
+    const unsigned flags = input.take(4);
+    const unsigned modes = input.take(1);
+    const unsigned mode = (modes & 3) | (modes & 4 ? QvScale::placeTarget : 0);
+    int rectangles[8];
+    for (int i = 0; i < 8; ++i)
+        rectangles[i] = static_cast<int>(modes & 8 ? input.take(4) : input.take(i < 4 ? 2 : 1));
+    source.memory.resize(bytesOf(source));
+    target.memory.resize(bytesOf(target));
+    for (size_t i = 0; i < source.memory.size(); ++i)
+        source.memory[i] = input.left() ? input.rest()[i % input.left()] : static_cast<uint8_t>(i * 37);
+    // The first line of a picture that goes upwards is the last one in memory.
+    const auto start = [](Given& given) -> uint8_t* {
+        if (given.memory.empty()) return nullptr;
+        return given.memory.data() +
+               (given.stride < 0 ? -static_cast<long long>(given.stride) * (given.height - 1) : 0);
+    };
+    SRScaler(mode, source.fourcc, start(source), source.stride, source.width, source.height, target.fourcc,
+             start(target), target.stride, target.width, target.height, 0, flags,
+             modes & 16 ? rectangles : nullptr);
+    return 0;
+}
