@@ -6,6 +6,7 @@
 
 #include "core/engine/qvexception.h"
 #include "tests/core/decode/fake_decoder.h"
+#include "tests/core/value/value_support.h"
 #include "tests/support/log_capture.h"
 
 namespace {
@@ -91,24 +92,14 @@ TEST_F(Contract, SeeksGoToTheFrameAndSampleOfATime) {
 TEST_F(Contract, ElementaryStreamsAreDescribed) {
     QvElementaryStream stream;
     decoder.elementaryStream(1, 0, &stream);
-    EXPECT_EQ(stream.type, 1);
-    EXPECT_TRUE(stream.filename == "a.mov");
+    EXPECT_TRUE(stream.filename == "a.mov" && stream.framerate == QvFramerate(25.0));
+    EXPECT_TRUE(stream.type == 1 && stream.videoCodec == "N/A" && stream.pid == 33);
     EXPECT_EQ(stream.rate, 1234567);
-    EXPECT_TRUE(stream.framerate == QvFramerate(25.0));
-    EXPECT_TRUE(stream.videoCodec == "N/A");
-    EXPECT_EQ(stream.pid, 33);
     decoder.elementaryStream(2, 0, &stream);
-    EXPECT_EQ(stream.rate, 192000);
-    EXPECT_EQ(stream.pid, -1);
+    EXPECT_TRUE(stream.rate == 192000 && stream.pid == -1);
 
-    const auto refusal = [this](int type, int nr, QvElementaryStream* out) -> std::string {
-        try {
-            decoder.elementaryStream(type, nr, out);
-        } catch (const QvAssertFailure& failure) {
-            const std::string text = failure.what();
-            return text.substr(text.find('\n') + 1);
-        }
-        return "";
+    const auto refusal = [this](int type, int nr, QvElementaryStream* out) {
+        return failureOf([&] { decoder.elementaryStream(type, nr, out); });
     };
     EXPECT_EQ(refusal(1, 0, nullptr), "Invalid stream pointer");
     EXPECT_EQ(refusal(4, 0, &stream), "Invalid stream type");
@@ -202,11 +193,10 @@ TEST_F(Contract, ReportsOfShortStreams) {
         ASSERT_TRUE(report) << samples;
         EXPECT_EQ(report->nrGroups(), samples / 1600 + 1);
         EXPECT_EQ(report->peak(report->nrGroups() - 1), samples == 1601 ? 100 : 0);
+        if (samples == 0) {
+            EXPECT_EQ(report->peakdB(0, 100), -91.0);
+        }
     }
-    decoder.close();
-    decoder.samples = 0;
-    decoder.open();
-    EXPECT_EQ(decoder.getAudioStreamReport(0)->peakdB(0, 100), -91.0);
 }
 
 }  // namespace
