@@ -63,8 +63,12 @@ int QvCcData::readScc(const Any& filename, int type, bool detect, QvFramerate& r
     auto word = scc.words.begin();
     for (const SccLine& line : scc.lines) {
         const MediaTime time(line.timecode.frameNr(rate, false), rate, MediaTime::defaultTimescale);
-        for (std::size_t i = 0; i < line.words; ++i, ++word)
-            append(QvCcBytePair(time, type, *word >> 8, *word, true));
+        QvCcBytePair pair(time, type, 0, 0, true);
+        for (std::size_t i = 0; i < line.words; ++i, ++word) {
+            pair.byte1 = static_cast<unsigned char>(*word >> 8);
+            pair.byte2 = static_cast<unsigned char>(*word);
+            append(pair);
+        }
     }
     return QvStatus::ok;
 }

@@ -93,18 +93,21 @@ bool readTimecode(std::string_view token, bool dropFrameLines, QvTimecode& timec
     return true;
 }
 
-int hexDigit(char c) {
-    if (c >= '0' && c <= '9') return c - '0';
-    if (c >= 'a' && c <= 'f') return c - 'a' + 10;
-    if (c >= 'A' && c <= 'F') return c - 'A' + 10;
-    return -1;
-}
+// Of each byte, -1 for what is no digit.
+constexpr auto hexDigits = [] {
+    std::array<signed char, 256> digits{};
+    digits.fill(-1);
+    for (int i = 0; i < 16; ++i)
+        digits[static_cast<unsigned char>("0123456789abcdef"[i])] =
+            digits[static_cast<unsigned char>("0123456789ABCDEF"[i])] = static_cast<signed char>(i);
+    return digits;
+}();
 
 // Four digits; what is no digit ends the number, as in "942x".
 std::uint16_t readWord(std::string_view token) {
     int value = 0;
     for (const char c : token) {
-        const int digit = hexDigit(c);
+        const int digit = hexDigits[static_cast<unsigned char>(c)];
         if (digit < 0)
             return static_cast<std::uint16_t>(std::strtol(std::string(token).c_str(), nullptr, 16));
         value = value * 16 + digit;
