@@ -21,6 +21,10 @@ endif()
 
 # Sanitizers need frames and line numbers, and -O1 to be fast enough for whole transcodes.
 set(CMAKE_CXX_FLAGS_SANITIZE "-O1 -g1 -fno-omit-frame-pointer")
+# Fuzz targets are guided by what the library's own code covers.
+if(QV_BUILD_FUZZ)
+  add_compile_options(-fsanitize=fuzzer-no-link)
+endif()
 if(QV_SANITIZE)
   add_compile_options(-fsanitize=${QV_SANITIZE} -fno-sanitize-recover=all)
   add_link_options(-fsanitize=${QV_SANITIZE})
