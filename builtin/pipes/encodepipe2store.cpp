@@ -173,7 +173,8 @@ int EncodePipe2::restoreStream(const AnyDict& entry, int type) {
 }
 
 // The form without a version: "_preset" (a number), "muxer" with "name", and for each of "video0" and
-// "audio0" the name of its encoder in "codec", with the encoder's parameters beside it or in "settings".
+// "audio0" the name of its encoder in "codec", with the encoder's parameters beside it or in "settings". A
+// user's preset that was active is in "_userProfile".
 int EncodePipe2::restoreOld(const AnyDict& state) {
     const Any& number = state.get(state.get("_preset").isInt32() ? "_preset" : "_presetNr");
     if (!number.isInt32()) {
@@ -198,6 +199,13 @@ int EncodePipe2::restoreOld(const AnyDict& state) {
     if (state.get("settings").isDict())
         for (const auto [key, value] : state.get("settings").asDict())
             forwardToEncoders(qvAllStreams, key, *value);
+    if (state.get("_userProfile").isDict()) {
+        const QvPreset user(state.get("_userProfile").asDict());
+        if (user.isCustom() && qvFixOldProfileNo(user.profile()) == preset_.profile()) {
+            preset_ = user;
+            rebuildAllowed();
+        }
+    }
     if (state.get("filename").isText()) setFilename(state.get("filename"));
     return QvStatus::ok;
 }

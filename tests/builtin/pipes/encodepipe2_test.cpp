@@ -218,7 +218,9 @@ TEST_F(EncodePipeTest, BadStatesAreRefused) {
     }
     AnyDict old("_preset", QvProfile::raw, "muxer", AnyDict("name", "rawmux"));
     old.set("video0", AnyDict("codec", "rawvenc", "width", 96));
+    old.set("_userProfile", AnyDict("name", "mine", "profile", QvProfile::raw));
     ASSERT_EQ(pipe().restore(old), 0);
+    EXPECT_STREQ(pipe().activePreset()->name(), "mine");
     EXPECT_EQ(pipe().nrStreams(), 1);
     EXPECT_EQ(get("video0/width"), Any(96));
     EXPECT_THROW(pipe().restore(AnyDict("muxer", 1)), QvAssertFailure);
