@@ -213,6 +213,8 @@ class Band {
             if (line != to) std::memcpy(to, line, count(n));
         } else if (group.spread == Group::doubled) {
             doubleLine(to, line, count(width));
+        } else if (group.spread == Group::everySecond) {
+            evens(to, line, count(width));
         } else {
             twice(to, line, count(width / 2));
             if (width & 1) to[width - 1] = line[width / 2 - 1];
@@ -332,7 +334,7 @@ class Band {
         S* planes[4] = {};
         for (int p = 0; p < (plan_.alpha ? 4 : 3); ++p) planes[p] = const_cast<S*>(finalLine(p, y));
         if constexpr (!deep) {
-            packLine(format, Line8{{planes[0], planes[1], planes[2], alphaLine(planes[3])}}, line, width);
+            packLine(format, Line8{{planes[0], planes[1], planes[2], planes[3]}}, line, width);
         } else if (format.deep()) {
             Byte* chroma = format.packing == Packing::nv16 ? lineOf(target_, 1, y) : nullptr;
             packLine(format, Line16{{planes[0], planes[1], planes[2], planes[3]}}, line, chroma, width);
@@ -342,12 +344,10 @@ class Band {
                 const int n = p == 1 || p == 2 ? width / format.across() : width;
                 narrow(bytes.plane[p], planes[p], count(n), fullRange(format, p));
             }
-            bytes.plane[3] = alphaLine(plan_.alpha ? bytes.plane[3] : nullptr);
+            if (!plan_.alpha) bytes.plane[3] = nullptr;
             packLine(format, bytes, line, width);
         }
     }
-
-    static Byte* alphaLine(Byte* alpha) { return alpha; }
 
     bool packFused(int y, Byte* line) {
         if constexpr (!deep) {

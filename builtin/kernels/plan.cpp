@@ -61,6 +61,16 @@ struct Maker {
         return made;
     }
 
+    static Group::Spread chromaSpread(const Mapping& mapping, const Axis& across, Filter filter) {
+        const int from = across.source, to = across.target;
+        if (mapping == Mapping{0, 2} && filter == Filter::nearest && to == from / 2)
+            return Group::everySecond;
+        if (mapping != Mapping{0, 0.5} || from != to / 2) return Group::none;
+        return filter == Filter::nearest  ? Group::repeated
+               : filter == Filter::linear ? Group::doubled
+                                          : Group::none;
+    }
+
     // Where nothing is filtered across, or by two, the pass down works on bytes, if its weights let it.
     void setSpread(Group& group, Group::Spread spread) const {
         if (plan.deep || group.empty() || group.across.target == 0) return;
@@ -93,12 +103,8 @@ struct Maker {
                                  request.width / toAcross.factor, filterOf(across)),
                             axis(chromaMapping(down, fromDown, toDown), lines(sourceHeight / fromDown.factor),
                                  lines(request.height / toDown.factor), filterOf(down)));
-        const bool everySecond = chromaAcross == Mapping{0, 0.5} && request.width / 2 == sourceWidth / 2;
         setSpread(made.luma, Group::none);
-        setSpread(made.chroma, !everySecond                          ? Group::none
-                               : filterOf(across) == Filter::nearest ? Group::repeated
-                               : filterOf(across) == Filter::linear  ? Group::doubled
-                                                                     : Group::none);
+        setSpread(made.chroma, chromaSpread(chromaAcross, made.chroma.across, filterOf(across)));
         return made;
     }
 };

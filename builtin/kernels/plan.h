@@ -30,9 +30,9 @@ struct Request {
 struct Group {
     Axis across, down;
     Across bytesAcross;
-    // Bytes that need no words between the passes: across, lines are copied, or chroma on every second pixel
-    // is repeated or interpolated behind the pass down.
-    enum Spread : uint8_t { none, asIs, repeated, doubled } spread = none;
+    // Bytes that need no words between the passes: across, lines are copied, or chroma of every second pixel
+    // is repeated, interpolated or picked out behind the pass down.
+    enum Spread : uint8_t { none, asIs, repeated, doubled, everySecond } spread = none;
     std::vector<int8_t> bytesDown;  // of the pass down, for each line
     bool copies() const { return across.copies && down.copies; }
     bool empty() const { return across.source == 0 || down.source == 0; }  // nothing to scale from

@@ -533,6 +533,15 @@ void twice(Byte* to, const Byte* from, size_t n) {
     for (; i < n; ++i) to[2 * i] = to[2 * i + 1] = from[i];
 }
 
+void evens(Byte* to, const Byte* from, size_t n) {
+    size_t i = 0;
+#if QV_VECTORS
+    for (; i + lanes() <= n; i += lanes())
+        put(hn::ConcatEven(d8, load(from + 2 * i + lanes()), load(from + 2 * i)), to + i);
+#endif
+    for (; i < n; ++i) to[i] = from[2 * i];
+}
+
 void doubleLine(Byte* to, const Byte* from, size_t n) {
     const size_t samples = n / 2;
     size_t i = 0;
@@ -618,6 +627,7 @@ QV_KERNEL(toFullLevels, (Byte * to, const Byte* from, size_t n), (to, from, n))
 QV_KERNEL(widen, (uint16_t * to, const Byte* from, size_t n, bool full), (to, from, n, full))
 QV_KERNEL(narrow, (Byte * to, const uint16_t* from, size_t n, bool full), (to, from, n, full))
 QV_KERNEL(twice, (Byte * to, const Byte* from, size_t n), (to, from, n))
+QV_KERNEL(evens, (Byte * to, const Byte* from, size_t n), (to, from, n))
 QV_KERNEL(doubleLine, (Byte * to, const Byte* from, size_t n), (to, from, n))
 QV_KERNEL(quarterWay, (Byte * to, const Byte* near, const Byte* far, size_t n), (to, near, far, n))
 QV_KERNEL(halfWay, (Byte * to, const Byte* near, const Byte* far, size_t n), (to, near, far, n))

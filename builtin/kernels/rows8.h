@@ -47,6 +47,8 @@ void narrow(Byte* to, const uint16_t* from, size_t n, bool full);
 
 // Each sample twice: 2 * n samples.
 void twice(Byte* to, const Byte* from, size_t n);
+// Every second sample, from the first on: n of 2 * n.
+void evens(Byte* to, const Byte* from, size_t n);
 // Linear interpolation, rounded to the nearest: between chroma samples that lie on every second pixel, `n`
 // pixels from n / 2 samples (the last one goes on); between two lines, a quarter or half of the way to `far`.
 void doubleLine(Byte* to, const Byte* from, size_t n);

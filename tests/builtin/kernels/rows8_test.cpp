@@ -131,6 +131,7 @@ const Kernel kernels[] = {
     {"narrow", {twoBytes}, {one}, [](const Lines& l) { narrow(l.out[0], l.words(0), l.n, false); }},
     {"narrow full", {twoBytes}, {one}, [](const Lines& l) { narrow(l.out[0], l.words(0), l.n, true); }},
     {"twice", {one}, {twoBytes}, [](const Lines& l) { twice(l.out[0], l.in[0], l.n); }},
+    {"evens", {twoBytes}, {one}, [](const Lines& l) { evens(l.out[0], l.in[0], l.n); }},
     {"doubleLine", {half}, {one}, [](const Lines& l) { doubleLine(l.out[0], l.in[0], l.n); }},
     {"quarterWay",
      {one, one},
