@@ -76,8 +76,18 @@ std::unique_ptr<QvDecodePipe> openFiles(const std::vector<std::string>& files) {
                                    ": it is no SCC file, or no line of it has captions");
 }
 
+// As that the rate is a guess.
+void printWarnings() {
+    AnyVector messages;
+    qv_log()->getAll(messages);
+    for (const Any& message : messages)
+        if (message.asDict().getInt32("type") == QvLogMask::warning)
+            std::fprintf(stderr, "tarsel: warning: %s\n", message.asDict().getString("text", ""));
+}
+
 void showCaptions(const std::vector<std::string>& files, bool json) {
     const auto decoder = openFiles(files);
+    printWarnings();
     const QvFramerate rate = decoder->QvCodec::getParam("framerate").asFramerate();
     decoder->select(kSubpicture, 0);
     const int frames = decoder->nrFrames(0);
