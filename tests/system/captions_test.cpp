@@ -19,7 +19,7 @@ TEST_F(Captions, LinesOfBothFieldsInTheOrderOfTime) {
     EXPECT_THAT(tarsel({"captions", "b.scc", "--json"}).out,
                 testing::AllOf(testing::HasSubstr("\"time\":\"01:00:05;01\""),
                                testing::HasSubstr("\"bytes\":\"1520 d5ee 19b7\"")));
-    EXPECT_THAT(tarsel({"info", "a.scc"}).out, testing::HasSubstr("timecode 29.97p DF"));
+    EXPECT_THAT(tarsel({"info", "a.scc"}).out, testing::HasSubstr("CEA-608, 29.97p DF"));
     folder.write("guess.scc", header + "00:00:00:02 9420");
     EXPECT_THAT(tarsel({"captions", "guess.scc"}).err, testing::HasSubstr("Framerate guess"));
 }
