@@ -145,9 +145,11 @@ std::unique_ptr<Workspace> Plan::takeWorkspace() const {
     return std::make_unique<Workspace>(*this);
 }
 
-void Plan::giveBack(std::unique_ptr<Workspace> workspace) const {
+void Plan::keepWorkspaces() { idle_.reserve(mostKept); }
+
+void Plan::giveBack(std::unique_ptr<Workspace> workspace) const noexcept {
     const std::lock_guard guard(lock_);
-    idle_.push_back(std::move(workspace));
+    if (idle_.size() < idle_.capacity()) idle_.push_back(std::move(workspace));
 }
 
 namespace {
@@ -161,6 +163,7 @@ std::shared_ptr<const Plan> makePlan(const Request& request) {
     const bool plain = !scales(request) && !plan->otherMatrix && request.sourceDepth == request.targetDepth;
     plan->path = pathOf(request.source, request.target, plain ? Use::plain : Use::scaling);
     if (!plan->path) return nullptr;
+    plan->keepWorkspaces();
     plan->deep = isDeep(plan->path.from);
     plan->workWidth = widest(*plan);
     if (plan->path.from == Core::lines || plan->path.from == Core::packed8) return plan;

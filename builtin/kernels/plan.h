@@ -64,7 +64,8 @@ struct Plan {
 
     // Memory of the bands that are at work, kept between pictures.
     std::unique_ptr<Workspace> takeWorkspace() const;
-    void giveBack(std::unique_ptr<Workspace> workspace) const;
+    void giveBack(std::unique_ptr<Workspace> workspace) const noexcept;
+    void keepWorkspaces();  // makes room for those that come back
 
     Plan();
     ~Plan();
@@ -72,6 +73,8 @@ struct Plan {
     Plan& operator=(const Plan&) = delete;
 
   private:
+    static constexpr size_t mostKept = 16;  // as many as a picture has bands
+
     mutable std::mutex lock_;
     mutable std::vector<std::unique_ptr<Workspace>> idle_;
 };
