@@ -32,6 +32,7 @@ if(NOT QV_SANITIZE)
   set_target_properties(qvplugcore PROPERTIES LINK_DEPENDS ${CMAKE_SOURCE_DIR}/cmake/exports.map)
 endif()
 set_target_properties(qvplugcore PROPERTIES VERSION ${PROJECT_VERSION} SOVERSION ${PROJECT_VERSION_MAJOR})
+target_compile_features(qvplugcore INTERFACE cxx_std_20)  # of its headers
 target_include_directories(qvplugcore INTERFACE
   $<BUILD_INTERFACE:${CMAKE_SOURCE_DIR}> $<BUILD_INTERFACE:${CMAKE_BINARY_DIR}/include>
   $<INSTALL_INTERFACE:include> $<INSTALL_INTERFACE:include/qvplugcore>)

@@ -1,6 +1,7 @@
 // One picture of a video, or a sheet of many, as a PNG.
 #include <algorithm>
 #include <cmath>
+#include <cstdio>
 
 #include "commands.h"
 #include "failure.h"
@@ -69,6 +70,7 @@ void save(const QvFrame& picture, const Given& given) {
                                         inLine(outputs.withFinalNames(reason)));
     }
     outputs.commit("png");
+    std::fprintf(stderr, "tarsel: wrote %s\n", inQuotes(given.output).c_str());
 }
 
 void saveSheet(Source& source, const Given& given, long long frames) {

@@ -317,7 +317,9 @@ void Job::checkConverters(const JobStream& stream) const {
     if (stream.type == kAudio) {
         if (differs("samplerate", stream.samplerate)) makeAnyCodec("srconvert", kAudioFilter);
         if (differs("channels", stream.channels)) makeAnyCodec("chconvert", kAudioFilter);
-        if (differs("bitsPerSample", stream.bits)) makeAnyCodec("aquant", kAudioFilter);
+        // Filters work on 32 bits.
+        if (differs("bitsPerSample", stream.bits) || stream.params.filters())
+            makeAnyCodec("aquant", kAudioFilter);
         return;
     }
     if (differs("width", stream.width) || differs("height", stream.height) ||
@@ -328,7 +330,6 @@ void Job::checkConverters(const JobStream& stream) const {
 }
 
 void Job::planFilters() {
-    for (const JobStream& stream : streams_) checkConverters(stream);
     for (JobStream& stream : streams_)
         if (!options_.from.empty() || !options_.to.empty())
             stream.params.setInOutPoints(InOutPoints(stream.in, stream.out));
@@ -350,4 +351,5 @@ void Job::planFilters() {
     }
     for (JobStream& stream : streams_)
         if (!states[stream.type - 1].empty()) stream.params.setFilters(states[stream.type - 1]);
+    for (const JobStream& stream : streams_) checkConverters(stream);
 }

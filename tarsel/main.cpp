@@ -7,6 +7,9 @@
 #include <new>
 #include <sstream>
 
+#include <fcntl.h>
+#include <unistd.h>
+
 #include <qvplugcore/qvplugcore.h>
 #include <CLI/CLI.hpp>
 
@@ -17,6 +20,29 @@
 
 namespace {
 
+// The engine traces the unloading of plug-ins on the standard error, past any log; a user would take it for
+// talk.
+class QuietStderr {
+  public:
+    explicit QuietStderr(bool on) {
+        if (!on) return;
+        saved_ = fcntl(STDERR_FILENO, F_DUPFD_CLOEXEC, 3);
+        const int nowhere = open("/dev/null", O_WRONLY | O_CLOEXEC);
+        if (saved_ >= 0 && nowhere >= 0) dup2(nowhere, STDERR_FILENO);
+        if (nowhere >= 0) close(nowhere);
+    }
+    ~QuietStderr() {
+        if (saved_ < 0) return;
+        dup2(saved_, STDERR_FILENO);
+        close(saved_);
+    }
+    QuietStderr(const QuietStderr&) = delete;
+    QuietStderr& operator=(const QuietStderr&) = delete;
+
+  private:
+    int saved_ = -1;
+};
+
 // The engine, from the first command to the end of the program.
 class Engine {
   public:
@@ -24,11 +50,18 @@ class Engine {
         AnyDict config;
         if (!log.empty()) config.set("logfile", log.c_str());
         init_wrapper(&config);
-        if (!plugins.empty() && qv_registry()->scanFolder(Any(plugins.c_str())) != QvStatus::ok)
+        pluginsLoaded_ = !plugins.empty();
+        if (pluginsLoaded_ && qv_registry()->scanFolder(Any(plugins.c_str())) != QvStatus::ok)
             std::fprintf(stderr, "tarsel: warning: no plug-ins in %s\n", inQuotes(plugins).c_str());
         qvPresetMgr()->update();
     }
-    ~Engine() { cleanup_wrapper(); }
+    ~Engine() {
+        const QuietStderr quiet(pluginsLoaded_);
+        cleanup_wrapper();
+    }
+
+  private:
+    bool pluginsLoaded_ = false;
 };
 
 std::vector<std::string> subcommandNames(const CLI::App& app) {

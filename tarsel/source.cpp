@@ -48,12 +48,26 @@ std::unique_ptr<QvCodec> makeAnyCodec(const std::string& module, int kind) {
     return codec;
 }
 
+namespace {
+
+std::vector<std::string> storedNames(const QvCodec& codec) {
+    AnyDict state;
+    codec.store(state);
+    std::vector<std::string> names;
+    for (int i = 0; i < state.size(); ++i)
+        if (const std::string name = state.getKey(i); name.rfind("_", 0) != 0) names.push_back(name);
+    return names;
+}
+
+}  // namespace
+
 void setChecked(QvCodec& codec, const std::string& name, const Any& value, const std::string& what) {
     int result = QvStatus::invalidParam;
     try {
         result = codec.setParam(name.c_str(), value);
     } catch (const QvParamException&) {
-        throw Failure(Exit::usage, what + ": " + codec.name() + " has no parameter " + inQuotes(name));
+        throw Failure(Exit::usage, what + ": " + codec.name() + " has no parameter " + inQuotes(name) + "." +
+                                       suggestion(name, storedNames(codec)));
     }
     if (result == QvStatus::ok) return;
     const std::string reason = codec.errorDesc();

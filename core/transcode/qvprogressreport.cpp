@@ -2,7 +2,7 @@
 #include <climits>
 #include <string_view>
 
-#include "core/transcode/qvtranscoderun.h"
+#include "core/transcode/qvtranscoderun_p.h"
 
 namespace {
 

@@ -17,7 +17,7 @@
 #include "core/media/qvgeometry.h"
 #include "core/stream/qvmetadatafile.h"
 #include "core/transcode/qvtranscoder_p.h"
-#include "core/transcode/qvtranscoderun.h"
+#include "core/transcode/qvtranscoderun_p.h"
 #include "core/transcode/translink.h"
 #include "core/value/qvassert.h"
 

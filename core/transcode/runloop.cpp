@@ -15,7 +15,7 @@
 #include "core/engine/qvtimer.h"
 #include "core/engine/status.h"
 #include "core/stream/qvmetadatafile.h"
-#include "core/transcode/qvtranscoderun.h"
+#include "core/transcode/qvtranscoderun_p.h"
 #include "core/transcode/translink.h"
 
 namespace {

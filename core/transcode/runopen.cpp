@@ -13,7 +13,7 @@
 #include "core/engine/status.h"
 #include "core/preset/qvpreset.h"
 #include "core/preset/qvpresetmgr.h"
-#include "core/transcode/qvtranscoderun.h"
+#include "core/transcode/qvtranscoderun_p.h"
 #include "core/transcode/translink.h"
 #include "core/value/qvassert.h"
 

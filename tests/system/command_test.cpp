@@ -1,6 +1,4 @@
 // The command line itself: what is wrong is told with what was meant, and data stays apart from talk.
-#include <nlohmann/json.hpp>
-
 #include "tests/system/tool.h"
 
 namespace {
@@ -50,6 +48,14 @@ TEST_F(Command, WrongUseIsTold) {
          {"'pxel'", "Did you mean 'pixel'?"}},
         {2, {"frame", "testgen", "--at", "11", "-o", "x.png"}, {"--at 11", "behind the end"}},
         {2, {"frame", "testgen", "--at", "1", "-o", "x.jpg"}, {"'x.jpg'", "png"}},
+        {2,
+         {"transcode", "testgen", "--filter", "scaler:outWidht=3", "-o", "x.raw"},
+         {"'outWidht'", "no parameter"}},
+        {2, {"transcode", "testgen", "--filter", "scaler:outWidth", "-o", "x.raw"}, {"key=value"}},
+        {2,
+         {"transcode", "testgen", "--filter", "scaler:outWidth=x", "-o", "x.raw"},
+         {"'outWidth'", "\"x\""}},
+        {2, {"transcode", "in.wav", "--filter", "scaler", "-o", "x.wav"}, {"--filter scaler", "no picture"}},
         {2, {"info"}, {"FILE"}},
         {2, {"modules", "--jsn"}, {"'--jsn'", "Did you mean '--json'?"}},
         {2, {"modules", "more"}, {"'more'"}},

@@ -1,6 +1,4 @@
 // Pictures, and the sound that belongs to them, from source to file.
-#include <nlohmann/json.hpp>
-
 #include "tests/system/tool.h"
 
 namespace {
@@ -34,6 +32,20 @@ TEST_F(Picture, GeneratedFramesAndTheirSamples) {
     works({"transcode", "testgen:size=96x64,rate=30000/1001,duration=4", "-o", "again.raw"});
     EXPECT_TRUE(card == contents("again.raw"));
     EXPECT_TRUE(contents("card.wav") == contents("again.wav"));
+}
+
+TEST_F(Picture, PicturesAsFiles) {
+    works({"transcode", "testgen:size=64x48,rate=25,duration=0.48", "-o", "shot.png"});
+    EXPECT_EQ(listing().size(), 13u) << "twelve pictures and their sound";
+    works({"frame", "testgen:size=64x48,rate=25,duration=0.48", "--at", "7f", "-o", "seven.png"});
+    EXPECT_TRUE(contents("seven.png") == contents("shot#07.png"));
+    // A frame of a raw file is the one that the generator made.
+    works({"transcode", "testgen:size=64x48,rate=25,duration=0.48", "-o", "card.raw"});
+    works({"frame", "card.raw", "--raw", "size=64x48,pixel=BGR4,rate=25", "--at", "0.3", "-o", "raw.png"});
+    EXPECT_TRUE(contents("seven.png") == contents("raw.png"));
+    works({"frame", "card.raw", "--raw", "size=64x48,pixel=BGR4", "--sheet", "3x2", "-o", "sheet.png"});
+    EXPECT_EQ(contents("sheet.png").substr(12, 4), "IHDR");
+    fails(4, {"frame", "testgen", "-o", "raw.png"}, {"'raw.png'", "exists", "-y"});
 }
 
 TEST_F(Picture, FramesBetweenPointsAreThoseOfTheInput) {

@@ -1,6 +1,4 @@
 // Sound from file to file: every sample arrives.
-#include <nlohmann/json.hpp>
-
 #include "tests/system/tool.h"
 
 namespace {

@@ -3,7 +3,7 @@
 #include <string>
 #include <vector>
 
-#include "core/transcode/qvtranscoderun.h"
+#include "core/transcode/qvtranscoderun_p.h"
 
 namespace {
 
