@@ -192,11 +192,11 @@ bool HeaderReader::chunksFillTheRest(long long position) {
 // Sizes left by recorders that could not go back to the header, as they are or cut to whole samples, and
 // 32-bit sizes that a file beyond 4 GiB has overrun.
 bool HeaderReader::sizeIsUnknown(std::uint32_t size, long long present) {
-    constexpr std::uint32_t placeholders[] = {0xFFFFFFFF, 0x80000000, 0x7FFFFFFF, 0x7FFFF000};
+    constexpr std::uint32_t unpatched[] = {0xFFFFFFFF, 0x80000000, 0x7FFFFFFF, 0x7FFFF000};
     if (size == 0) return !chunksFillTheRest(header_.dataOffset);
     const auto frame = static_cast<std::uint32_t>(header_.frameBytes());
-    for (const std::uint32_t placeholder : placeholders)
-        if (size > present && (size == placeholder || size == placeholder - placeholder % frame)) return true;
+    for (const std::uint32_t size32 : unpatched)
+        if (size > present && (size == size32 || size == size32 - size32 % frame)) return true;
     return present > std::numeric_limits<std::uint32_t>::max() && static_cast<std::uint32_t>(present) == size;
 }
 

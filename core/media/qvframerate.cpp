@@ -127,11 +127,11 @@ int QvFramerate::findInVector(const AnyVector& rates, bool exact, bool compareDf
     return -1;
 }
 
-#define QV_NAMED_RATE(name, num, den, scan, value)                                  \
+#define QV_NAMED_RATE(name, num, den, scan, value)                                    \
     bool QvFramerate::is##name() const { return isNamed(*this, value, (scan) != 0); } \
-    const QvFramerate& QvFramerate::f##name() {                                     \
-        static const QvFramerate constant = named(num, den, scan);                  \
-        return constant;                                                            \
+    const QvFramerate& QvFramerate::f##name() {                                       \
+        static const QvFramerate constant = named(num, den, scan);                    \
+        return constant;                                                              \
     }
 
 QV_NAMED_RATE(23p, 24000, 1001, 0, 23.976023976023978)

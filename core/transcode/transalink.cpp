@@ -20,8 +20,8 @@ constexpr int defaultBits = 16;
 
 int bytesOf(int bits) { return (bits + 7) / 8; }
 
-// An instant within the sample. Not every rate divides the timescale: where a tick before it is meant, the next
-// one is, since its position would otherwise be the sample before.
+// An instant within the sample. Not every rate divides the timescale: where a tick before it is meant, the
+// next one is, since its position would otherwise be the sample before.
 MediaTime sampleTime(long long sample, int samplerate) {
     const MediaTime time(sample, samplerate, MediaTime::defaultTimescale);
     return time.position(samplerate) < sample ? time + MediaTime(1) : time;

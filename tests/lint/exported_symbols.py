@@ -5,7 +5,7 @@ import sys
 OWN = re.compile(r"""^(?:typeinfo\ (?:name\ )?for\ |vtable\ for\ |VTT\ for\ |guard\ variable\ for\ |
                       (?:non-virtual|virtual)\ thunk\ to\ |construction\ vtable\ for\ )?
                      (?:[\w:<>,\ *&]*\ )?
-                     (?:Qv|qv|QV|Any|AString|AS_|Pair|MediaTime|TransLink|TransVLink|TransALink|Xml|PtrListImp|TPtrList|
+                     (?:Qv|qv|QV|SRScaler|Any|AString|AS_|Pair|MediaTime|TransLink|TransVLink|TransALink|Xml|PtrListImp|TPtrList|
                         TRefList|InOutPoints|FiltersState|ProcessParams|MetaProcessParams|MetaVHelper|AudioMuxer|
                         BaseMuxer|BaseDecodePipe|DPipe|CodecCompat|PresetGroup|Generator|init_wrapper|cleanup_wrapper|
                         core_library_path|path_separator|execute_process|available_codepages|get_folder_|debug_trace|
