@@ -32,7 +32,7 @@ constexpr QvBuiltinRow registered[] = {
     {"rawaenc",      audioEncoder, "RAW Wave audio encoder module",  "RAW Wave Audio",             newRawaenc},
     {"frconvert",    videoFilter,  "Framerate converter",            "Change framerate",           nullptr},
     {"srconvert",    audioFilter,  "Samplerate converter",           "Change samplerate",          nullptr},
-    {"deinterlace",  videoFilter,  "Field deinterlace",              "Deinterlace",                nullptr},
+    {"deinterlace",  videoFilter,  "Field deinterlace",              "Deinterlace",                newDeinterlace},
     {"logo",         videoFilter,  "Insert logo into frame",         "Logo",                       nullptr},
     {"bobber",       videoFilter,  "Auto bob",                       "Auto bob",                   nullptr},
     {"cropper",      videoFilter,  "Crop filter",                    "Crop/pad",                   nullptr},

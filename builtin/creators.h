@@ -25,3 +25,4 @@ QvCodec* newVprocess();
 QvCodec* newAprocess();
 QvCodec* newEncpipe();
 QvCodec* newScaler();
+QvCodec* newDeinterlace();
