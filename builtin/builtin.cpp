@@ -5,6 +5,7 @@
 
 #include "builtin/builtinmodule.h"
 #include "builtin/creators.h"
+#include "core/caption/qvsubtitlefilter.h"
 #include "core/engine/builtinplugin_p.h"
 #include "core/engine/qvplugin.h"
 #include "core/value/qvassert.h"
@@ -36,7 +37,7 @@ constexpr QvBuiltinRow registered[] = {
     {"logo",         videoFilter,  "Insert logo into frame",         "Logo",                       nullptr},
     {"bobber",       videoFilter,  "Auto bob",                       "Auto bob",                   nullptr},
     {"cropper",      videoFilter,  "Crop filter",                    "Crop/pad",                   nullptr},
-    {"timecode",     videoFilter,  "Timecode inserter",              "Timecode",                   nullptr},
+    {"timecode",     videoFilter,  "Timecode inserter",              "Timecode",                   newTimecode},
     {"subimport",    decoder,      "Text subtitle importer",         "Subtitle import",            newSubimport,
      {.exts = "sub srt", .priority = 10}},
     {"testgen",      decoder,      "Test stream generator",          "Test input",                 newTestgen,
@@ -78,7 +79,7 @@ static_assert(std::size(registered) == 44);
 
 // Module classes that the registry does not list; code of the library makes them by class ("builtin/modules.h").
 constexpr QvBuiltinRow unregistered[] = {
-    {"subtitle",     videoFilter,  "Subtitle render",                "Subtitle render",            nullptr},
+    {"subtitle",     videoFilter,  "Subtitle render",                "Subtitle render",            newSubtitle},
     {"meminput",     decoder,      "Memory input",                   "Memory input",               nullptr,
      {.internal = true}},
 };
@@ -101,5 +102,12 @@ const QvBuiltinRow& qvBuiltinRow(const char* name) {
 QvPlugin* qvBuiltinPlugin() {
     static QvPlugin plugin("builtin", "Builtin modules");
     if (plugin.nrModules() == 0) addModules(plugin);
+    return &plugin;
+}
+
+QvPlugin* qvSubtitlePlugin() {
+    static QvPlugin plugin("subtitle", "Subtitle render");
+    if (plugin.nrModules() == 0)
+        plugin.addModule(std::make_unique<QvBuiltinModule>(qvBuiltinRow("subtitle")).release());
     return &plugin;
 }

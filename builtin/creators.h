@@ -26,3 +26,5 @@ QvCodec* newAprocess();
 QvCodec* newEncpipe();
 QvCodec* newScaler();
 QvCodec* newDeinterlace();
+QvCodec* newTimecode();
+QvCodec* newSubtitle();

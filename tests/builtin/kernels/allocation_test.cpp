@@ -1,35 +1,13 @@
 // A conversion that was met before takes no memory.
 #include <gtest/gtest.h>
 
-#include <atomic>
-#include <cstdlib>
 #include <cstring>
-#include <new>
 #include <tuple>
 #include <vector>
 
 #include "core/filter/srscaler.h"
 #include "core/media/fourcc.h"
-
-namespace {
-std::atomic<int> allocations{0};
-
-void* counted(std::size_t bytes, std::size_t align) {
-    ++allocations;
-    void* memory = std::aligned_alloc(align, (bytes + align - 1) / align * align + align);
-    if (!memory) throw std::bad_alloc();
-    return memory;
-}
-}  // namespace
-
-void* operator new(std::size_t bytes) { return counted(bytes, 16); }
-void* operator new(std::size_t bytes, std::align_val_t align) {
-    return counted(bytes, static_cast<std::size_t>(align));
-}
-void operator delete(void* memory) noexcept { std::free(memory); }
-void operator delete(void* memory, std::size_t) noexcept { std::free(memory); }
-void operator delete(void* memory, std::align_val_t) noexcept { std::free(memory); }
-void operator delete(void* memory, std::size_t, std::align_val_t) noexcept { std::free(memory); }
+#include "tests/support/counted_memory.h"
 
 TEST(Memory, IsTakenForTheFirstPictureOnly) {
     std::vector<unsigned char> from(64 * 48 * 8, 3), to(96 * 80 * 8);

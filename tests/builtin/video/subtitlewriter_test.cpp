@@ -1,0 +1,204 @@
+#include "builtin/video/subtitlewriter.h"
+
+#include <gtest/gtest.h>
+
+#include <memory>
+#include <vector>
+
+#include "core/caption/qvsubtitlefilter.h"
+#include "core/engine/qvmodule.h"
+#include "core/engine/qvplugin.h"
+#include "core/engine/qvregistry.h"
+#include "core/filter/qvprocessutil.h"
+#include "core/media/qvgeometry.h"
+#include "tests/support/engine.h"
+#include "tests/support/log_capture.h"
+#include "tests/support/pictures.h"
+#include "tests/support/temp_folder.h"
+
+namespace {
+
+// Shown from 1 to 2 s, from 3 to 4 s and from 5 to 6 s.
+constexpr const char* srt =
+    "1\n00:00:01,000 --> 00:00:02,000\nHello\n\n"
+    "2\n00:00:03,000 --> 00:00:04,000\n<i>two</i>\nlines\n\n"
+    "3\n00:00:05,000 --> 00:00:06,000\n\xE9t\xE9\n\n";
+
+struct Given {
+    const char* name;
+    Any value;
+};
+using Params = std::vector<Given>;
+
+class Subtitle : public testing::Test {
+  protected:
+    EngineScope engine_;
+    void SetUp() override {
+        if (qv_registry()->defaultFontFile(0).isFalse()) GTEST_SKIP() << "no font on this system";
+        file_ = folder_.write("talk.srt", srt);
+    }
+
+    static QvFrame blank(int number, const QvFramerate& rate = QvFramerate(QvRatio(25, 1))) {
+        QvFrame frame;
+        frame.init(QvFourcc::I420, 320, 240);
+        frame.setBlack();
+        frame.frameNr = number;
+        frame.framerate = rate;
+        return frame;
+    }
+    std::unique_ptr<SubtitleWriter> opened(const Params& params) const {
+        auto writer = std::make_unique<SubtitleWriter>();
+        writer->init();
+        writer->setParam("subtitle_filename", file_.c_str());
+        for (const auto& [name, value] : params) EXPECT_EQ(writer->setParam(name, value), 0) << name;
+        EXPECT_EQ(writer->open(), 0) << writer->errorDesc();
+        return writer;
+    }
+    std::string at(int number, const Params& params = {},
+                   const QvFramerate& rate = QvFramerate(QvRatio(25, 1))) {
+        QvFrame frame = blank(number, rate);
+        EXPECT_EQ(opened(params)->apply(frame), 0);
+        return pictureBytes(frame);
+    }
+    bool shows(int number, const Params& params = {}, const QvFramerate& rate = QvFramerate(QvRatio(25, 1))) {
+        return at(number, params, rate) != pictureBytes(blank(number, rate));
+    }
+
+    TempFolder folder_;
+    std::string file_;
+};
+
+TEST_F(Subtitle, IsShownAtItsTime) {
+    const struct {
+        Params params;
+        double rate;
+        int first, last;  // frames of the first subtitle
+    } cases[] = {
+        {{}, 25, 25, 50},
+        {{}, 29.97, 30, 59},
+        {{{"delay", 400}}, 25, 35, 60},
+        {{{"delay", -1000.0}}, 25, 0, 25},
+        {{{"speed", 2}}, 25, 13, 25},
+        {{{"speed", 0.5}, {"delay", -500}}, 25, 25, 75},
+    };
+    for (const auto& c : cases) {
+        const QvFramerate rate(c.rate);
+        const std::string text = at(c.first, c.params, rate);
+        EXPECT_EQ(text, at(c.last, c.params, rate));
+        EXPECT_TRUE(shows(c.first, c.params, rate)) << c.first;
+        EXPECT_FALSE(c.first > 0 && shows(c.first - 1, c.params, rate)) << c.first;
+        EXPECT_FALSE(shows(c.last + 1, c.params, rate)) << c.last;
+    }
+    EXPECT_NE(at(30), at(80)) << "another text";
+}
+
+TEST_F(Subtitle, FrameNumbersCountAtTheFilesRateOrThePictures) {
+    file_ = folder_.write("talk.sub", "{25}{50}Hello\n");
+    const QvFramerate fifty(QvRatio(50, 1));
+    EXPECT_TRUE(shows(25, {}, fifty));
+    EXPECT_FALSE(shows(24, {}, fifty) || shows(51, {}, fifty));
+    const Params at25{{"framerate", QvFramerate(QvRatio(25, 1))}};
+    EXPECT_TRUE(shows(50, at25, fifty) && shows(100, at25, fifty));
+    EXPECT_FALSE(shows(49, at25, fifty) || shows(101, at25, fifty));
+}
+
+TEST_F(Subtitle, EncodingIsOfTheFileUnlessItIsMarked) {
+    const std::string latin = at(125, {{"encoding", 1252}});
+    EXPECT_NE(latin, at(125)) << "é is no ASCII";
+    file_ = folder_.write("utf8.srt", "1\n00:00:05,000 --> 00:00:06,000\n\xC3\xA9t\xC3\xA9\n");
+    EXPECT_EQ(latin, at(125));
+    EXPECT_EQ(latin, at(125, {{"encoding", 1}}));
+    file_ = folder_.write("marked.srt",
+                          "\xEF\xBB\xBF"
+                          "1\n00:00:05,000 --> 00:00:06,000\n\xC3\xA9t\xC3\xA9\n");
+    EXPECT_EQ(latin, at(125, {{"encoding", 1252}}));
+}
+
+TEST_F(Subtitle, LooksAsItsParametersSay) {
+    const std::string plain = at(30);
+    EXPECT_EQ(plain, at(30, {{"color", 0xFFFFFF}}));
+    EXPECT_EQ(at(30, {{"color", 0xFF0000}}), at(30, {{"colorG", 0}, {"colorB", 0}}));
+    std::vector<std::string> all{plain};
+    for (const Params& params : {Params{{"colorB", 0}},
+                                 {{"font_size", 20}},
+                                 {{"fontEffect", 1}},
+                                 {{"fontEffect", 2}},
+                                 {{"fontEffect", 3}}}) {
+        all.push_back(at(30, params));
+        for (std::size_t i = 0; i + 1 < all.size(); ++i) EXPECT_NE(all[i], all.back()) << params[0].name << i;
+    }
+    const LogCapture log;
+    EXPECT_FALSE(shows(30, {{"font_filename", "/nowhere.ttf"}}));
+    EXPECT_TRUE(log.contains("The font /nowhere.ttf can't be read"));
+}
+
+TEST_F(Subtitle, OpeningTellsWhatItDoesAndFailsForNoSubtitleFile) {
+    const LogCapture log;
+    opened({{"speed", 1.5}, {"delay", 20}});
+    for (const std::string& line :
+         {"[subwriter] Subtitle file: " + file_, std::string("[subwriter] Font size: 32"),
+          std::string("[subwriter] Speed, offset: 1.500000, 20.000000"),
+          std::string("[subwriter] Encoding: 0")})
+        EXPECT_EQ(log.count(line, 8), 1) << line;
+    EXPECT_TRUE(log.contains("[subwriter] Font file: /"));
+    for (const std::string& name :
+         {folder_.file("gone.srt"), folder_.write("talk.txt", srt), folder_.file("")}) {
+        SubtitleWriter writer;
+        writer.init();
+        writer.setParam("subtitle_filename", name.c_str());
+        EXPECT_EQ(writer.open(), -9) << name;
+        EXPECT_EQ(std::string(writer.errorDesc()), "Failed to read subtitle file " + name);
+    }
+    file_.clear();
+    EXPECT_FALSE(shows(30)) << "without a file";
+    file_ = folder_.write("empty.srt", "");
+    EXPECT_FALSE(shows(30));
+    EXPECT_TRUE(log.contains("empty.srt has no subtitles", 4));
+}
+
+TEST_F(Subtitle, IsAModuleOnceAnApplicationAddsIt) {
+    EXPECT_EQ(qv_registry()->newCodec("subtitle"), nullptr);
+    QvPlugin* plugin = qvSubtitlePlugin();
+    ASSERT_EQ(plugin->nrModules(), 1);
+    EXPECT_EQ(plugin, qvSubtitlePlugin());
+    const std::unique_ptr<QvCodec> codec(plugin->module(0)->create()), other(plugin->module(0)->create());
+    codec->init();
+    other->init();
+    const struct {
+        const char* name;
+        Any initial, good, refused;
+    } rows[] = {
+        {"subtitle_filename", "", "/a b.srt", 1},
+        {"font_filename", "", "/a.ttf", 1},
+        {"font_size", 32, 20, 0},
+        {"speed", 1.0, 0.5, -1.0},
+        {"delay", 0.0, -20.5, "soon"},
+        {"encoding", 0, 1252, 99999},
+        {"framerate", Any(), QvFramerate(QvRatio(24, 1)), 0},
+        {"fontEffect", 0, 3, 4},
+        {"color", 0xFFFFFF, 0x102030, 0x1000000},
+    };
+    for (const auto& row : rows) {
+        EXPECT_EQ(codec->getParam(row.name), row.initial) << row.name;
+        EXPECT_EQ(codec->setParam(row.name, row.good), 0) << row.name;
+        EXPECT_NE(codec->setParam(row.name, row.refused), 0) << row.name;
+    }
+    AnyDict stored;
+    codec->store(stored);
+    EXPECT_EQ(other->restore(stored), 0);
+    for (const auto& row : rows) EXPECT_EQ(other->getParam(row.name), row.good) << row.name;
+    EXPECT_EQ(codec->getParam("colorG"), 0x20);
+    EXPECT_EQ(codec->getParam("encodingRange").asVector().at(2).asDict().get("name"), "UTF-8");
+    EXPECT_EQ(codec->getParam("fontEffectRange").asVector().at(3).asDict().get("name"),
+              "Outline w/ hard shadow");
+    const Any set = codec->getParam("paramSet");
+    EXPECT_EQ(set.asVector().size(), 7);
+    for (const Any& desc : set.asVector()) {
+        Any fault;
+        EXPECT_TRUE(QvProcessUtil::checkParamDesc(desc.asDict(), &fault)) << fault.asString("");
+        EXPECT_TRUE(codec->getParam(desc.asDict().getString("name", "")).isValid());
+    }
+    EXPECT_EQ(codec->getParam("format"), 0);
+}
+
+}  // namespace

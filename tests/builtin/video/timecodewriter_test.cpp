@@ -1,0 +1,204 @@
+#include "builtin/video/timecodewriter.h"
+
+#include <gtest/gtest.h>
+
+#include <climits>
+#include <memory>
+#include <tuple>
+#include <vector>
+
+#include "core/caption/qvtextrenderingoptions.h"
+#include "core/engine/qvregistry.h"
+#include "core/media/qvgeometry.h"
+#include "tests/support/counted_memory.h"
+#include "tests/support/engine.h"
+#include "tests/support/log_capture.h"
+#include "tests/support/pictures.h"
+
+namespace {
+
+const QvFramerate pal(QvRatio(25, 1)), palFields(QvRatio(25, 1), 1), drop(QvRatio(30000, 1001), 0, true);
+
+struct Given {
+    const char* name;
+    Any value;
+};
+using Params = std::vector<Given>;
+
+struct Writer : TimecodeWriter {
+    explicit Writer(const Params& params = {}) {
+        init();
+        for (const auto& [name, value] : params) EXPECT_EQ(setParam(name, value), 0) << name;
+        EXPECT_EQ(open(), 0);
+    }
+};
+
+QvFrame black(int width, int height, const QvFramerate& rate, int number, unsigned fourcc = QvFourcc::BGR4) {
+    QvFrame frame;
+    frame.init(fourcc, width, height);
+    frame.setBlack();
+    frame.framerate = rate;
+    frame.frameNr = number;
+    return frame;
+}
+
+std::string written(const Params& params, QvFrame frame) {
+    Writer writer(params);
+    EXPECT_EQ(writer.apply(frame), 0);
+    return pictureBytes(frame);
+}
+
+// What the renderer draws.
+std::string drawn(const char* text, int size, QvPoint at, QvFrame frame) {
+    QvTextRenderingOptions options;
+    options.fontRegular = qv_registry()->defaultFontFile(0);
+    options.charSize = size;
+    QvSubtitle line;
+    line.text = text;
+    line.position = at;
+    QvSubtitleRender render;
+    render.init(options);
+    render.render(frame, line, nullptr);
+    return pictureBytes(frame);
+}
+
+class Timecode : public testing::Test {
+  protected:
+    EngineScope engine_;
+    void SetUp() override {
+        if (qv_registry()->defaultFontFile(0).isFalse()) GTEST_SKIP() << "no font on this system";
+    }
+};
+
+TEST_F(Timecode, CountsAsItsParametersSay) {
+    const struct {
+        Params params;
+        QvFramerate rate;
+        int number;
+        const char* text;
+    } cases[] = {
+        {{}, pal, 1000, "00:00:00:00*"},
+        {{{"start", "InPoint"}}, pal, 90061, "01:00:02:11*"},
+        {{{"start", "InPoint"}}, drop, 1800, "00;01;00;02*"},
+        {{{"start", "InPoint"}, {"startOffset", 25}}, pal, 50, "00:00:01:00*"},
+        {{{"startOffset", -90000}}, pal, 7, "01:00:00:00*"},
+        {{{"startOffset", 30}}, pal, 7, "23:59:58:20*"},
+        {{{"startOffset", INT_MIN}, {"mode", 0}}, pal, 7, "2147483647"},
+        {{{"mode", "Frame number"}, {"start", "InPoint"}}, pal, 42, "42"},
+        {{{"mode", 7}, {"startOffset", 3}}, pal, 42, "-3"},
+        {{{"mode", 1}}, pal, 42, "00:00:00:00*"},
+    };
+    for (const auto& c : cases) {
+        const QvFrame frame = black(320, 100, c.rate, c.number);
+        EXPECT_EQ(written(c.params, frame), drawn(c.text, 14, {112, 79}, frame)) << c.text;
+    }
+    Writer writer;
+    QvFrame first = black(320, 100, pal, 500), later = black(320, 100, pal, 525);
+    const std::string expected = drawn("00:00:01:00*", 14, {112, 79}, later);
+    writer.apply(first);
+    writer.apply(later);
+    EXPECT_EQ(pictureBytes(later), expected) << "the first frame stays the first";
+}
+
+TEST_F(Timecode, SizeAndPlaceFollowThePicture) {
+    const auto text = "00:00:00:00*";
+    for (const auto& [w, h, size] :
+         {std::tuple{1920, 1080, 94}, {720, 576, 49}, {64, 100, 14}, {3840, 2160, 189}}) {
+        const QvFrame frame = black(w, h, pal, 0);
+        EXPECT_EQ(written({}, frame), drawn(text, size, {w * 35 / 100, h - size * 3 / 2}, frame)) << w;
+    }
+    const QvFrame frame = black(720, 576, pal, 0);
+    EXPECT_EQ(written({{"positionX", 10}, {"positionY", 20}}, frame), drawn(text, 49, {10, 20}, frame));
+    EXPECT_EQ(written({{"positionY", 20}}, frame), drawn(text, 49, {252, 503}, frame)) << "x decides";
+    QvTextRenderingOptions options;
+    options.charSize = 20;
+    options.subEncoding = QvTextRenderingOptions::utf16;
+    AnyDict stored;
+    options.store(stored);
+    EXPECT_EQ(written({{"renderingOptions", stored}}, frame), drawn(text, 20, {252, 546}, frame));
+}
+
+TEST_F(Timecode, TheStarStandsInOneField) {
+    const std::string plain = written({}, black(320, 100, pal, 0));
+    const std::string fields = written({}, black(320, 100, palFields, 0));
+    int odd = 0, even = 0;
+    for (std::size_t i = 0; i < plain.size(); ++i)
+        if (plain[i] != fields[i]) ++(i / (320 * 4) % 2 ? odd : even);
+    EXPECT_GT(odd, 10);
+    EXPECT_EQ(even, 0);
+}
+
+TEST_F(Timecode, ColourAndFont) {
+    const auto red = [](const std::string& bytes) {
+        int count = 0;
+        for (std::size_t i = 0; i < bytes.size(); i += 4)
+            count += bytes[i + 2] == '\xFF' && !bytes[i + 1] && !bytes[i];
+        return count;
+    };
+    const QvFrame frame = black(720, 576, pal, 0);
+    EXPECT_GT(red(written({{"colorG", 0}, {"colorB", 0}}, frame)), 200);
+    const LogCapture log;
+    EXPECT_EQ(written({{"font_filename", "/nowhere.ttf"}}, frame), pictureBytes(frame));
+    EXPECT_TRUE(log.contains("The font /nowhere.ttf can't be read"));
+}
+
+TEST_F(Timecode, WriteDrawsOntoACopyAndTakesNoMemoryForAStillText) {
+    for (const unsigned fourcc : {QvFourcc::I420, QvFourcc::YUYV, QvFourcc::BGR3, QvFourcc::Y216}) {
+        const QvFrame original = black(320, 240, palFields, 3, fourcc);
+        QvFrame given(original);
+        Writer writer(Params{{"start", "InPoint"}});
+        EXPECT_EQ(writer.write(given), 0);
+        ASSERT_EQ(writer.ready(), 1);
+        EXPECT_EQ(pictureBytes(given), pictureBytes(original));
+        EXPECT_EQ(pictureBytes(*writer.frame()), written({{"start", "InPoint"}}, original));
+        EXPECT_NE(pictureBytes(*writer.frame()), pictureBytes(original)) << given.str_four_cc();
+        EXPECT_EQ(writer.frame()->frameNr, 3);
+        writer.next();
+        EXPECT_EQ(writer.ready(), 0);
+        const int before = allocations;
+        for (int i = 0; i < 5; ++i) writer.apply(given);
+        EXPECT_EQ(allocations, before);
+    }
+}
+
+TEST_F(Timecode, ParametersAreCheckedStoredAndRestored) {
+    const std::unique_ptr<QvCodec> codec(qv_registry()->newCodec("timecode"));
+    auto* writer = static_cast<QvVideoFilter*>(codec->getInterface(12));
+    ASSERT_TRUE(writer);
+    EXPECT_TRUE(writer->applySupported());
+    QvFrame frame = black(64, 64, pal, 0);
+    EXPECT_EQ(writer->apply(frame), -18);
+    const struct {
+        const char* name;
+        Any initial, good, refused;
+    } rows[] = {
+        {"mode", "Timecode", "Frame number", "frames"},
+        {"start", "FirstInputFrame", "InPoint", 1},
+        {"startOffset", 0, -5, "x"},
+        {"font_filename", "", "/a.ttf", 1},
+        {"colorR", 255, 1, 256},
+        {"colorG", 255, 0, -1},
+        {"colorB", 255, 128, "red"},
+        {"positionX", -1, 4, "left"},
+        {"positionY", -1, 5, Any()},
+        {"renderingOptions", AnyDict(), AnyDict("charSizePt", 20), 20},
+    };
+    for (const auto& row : rows) {
+        EXPECT_EQ(writer->getParam(row.name), row.initial) << row.name;
+        EXPECT_EQ(writer->setParam(row.name, row.good), 0) << row.name;
+        EXPECT_NE(writer->setParam(row.name, row.refused), 0) << row.name;
+        EXPECT_NE(std::string(writer->errorDesc()).find(row.name), std::string::npos);
+    }
+    EXPECT_EQ(writer->setParam("_previewMode", 1), 0);
+    AnyDict stored;
+    writer->store(stored);
+    const std::unique_ptr<QvCodec> other(qv_registry()->newCodec("timecode"));
+    EXPECT_EQ(other->restore(stored), 0);
+    for (const auto& row : rows) EXPECT_EQ(other->getParam(row.name), row.good) << row.name;
+    EXPECT_EQ(writer->open(), 0);
+    QvFrame deep = black(64, 64, pal, 0, QvFourcc::v210), nothing;
+    EXPECT_EQ(writer->apply(deep), -10);
+    EXPECT_EQ(writer->apply(nothing), -12);
+}
+
+}  // namespace
