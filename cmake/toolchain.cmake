@@ -29,6 +29,3 @@ if(QV_SANITIZE)
   add_compile_options(-fsanitize=${QV_SANITIZE} -fno-sanitize-recover=all)
   add_link_options(-fsanitize=${QV_SANITIZE})
 endif()
-if(QV_BUILD_FUZZ)
-  add_compile_options(-fsanitize=fuzzer-no-link)  # coverage of the library for the fuzzers
-endif()

@@ -55,7 +55,7 @@ std::vector<std::string> storedNames(const QvCodec& codec) {
     codec.store(state);
     std::vector<std::string> names;
     for (int i = 0; i < state.size(); ++i)
-        if (const std::string name = state.getKey(i); name.rfind("_", 0) != 0) names.push_back(name);
+        if (const std::string name = state.getKey(i); name[0] != '_') names.push_back(name);
     return names;
 }
 

@@ -32,7 +32,7 @@ Lines<S>::Lines(const Plan& plan) {
             stage.words[p].set(slots, width);
             stage.out[p].set(1, width);
         }
-    const auto around = static_cast<size_t>(width + beforeLine + behindLine);
+    const size_t around = static_cast<size_t>(width) + beforeLine + behindLine;
     padded.grow(around);
     if (sizeof(S) == 2) paddedWide.grow(around);
     narrowLength = static_cast<size_t>(width);
