@@ -1,39 +1,28 @@
 #include "core/value/any.h"
 
-#include <gtest/gtest.h>
-
 #include <limits>
-#include <string>
-#include <vector>
 
 #include "core/media/qvgeometry.h"
-#include "tests/core/value/value_support.h"
+#include "tests/support/checks.h"
 
 namespace {
 
 constexpr int lowestInt = std::numeric_limits<int>::min();
 constexpr int highestInt = std::numeric_limits<int>::max();
+const std::string nullAssignment = "Attempt to assign to Any::null()";
 constexpr const void* noBytes = nullptr;
 constexpr double nan = std::numeric_limits<double>::quiet_NaN();
 
+template <class... T>
+std::vector<Any> anys(const T&... values) {
+    return {Any(values)...};
+}
+
 // One value of each type, in the order of the type numbers.
 std::vector<Any> oneOfEach() {
-    static int borrowed = 0;
-    return {Any(),
-            Any(-5),
-            Any(2.5),
-            Any("text"),
-            Any(u"w\u00efde"),
-            Any(AnyDict("k", 1)),
-            Any(AnyVector(1, "b")),
-            Any(1LL << 40),
-            Any(static_cast<const void*>(&borrowed)),
-            Any(QvFramerate::f59i()),
-            Any(QvPoint(1, 2)),
-            Any(QvRect(1, 2, 3, 4)),
-            Any(QvBitrate(1, 2, 3, 4, 5)),
-            Any(Pair(6, 7)),
-            Any(MediaTime(9, 25))};
+    return anys(Any(), -5, 2.5, "text", u"w\u00efde", AnyDict("k", 1), AnyVector(1, "b"), 1LL << 40,
+                static_cast<const void*>("borrowed"), QvFramerate::f59i(), QvPoint(1, 2), QvRect(1, 2, 3, 4),
+                QvBitrate(1, 2, 3, 4, 5), Pair(6, 7), MediaTime(9, 25));
 }
 
 TEST(Any, typeNumbersAndNames) {
@@ -76,72 +65,46 @@ TEST(Any, aPartOfAValueMayReplaceTheWhole) {
 }
 
 TEST(Any, containersAndObjectsKeepTheirAddressWhileTheTypeStays) {
-    Any dict(AnyDict("a", 1));
-    const AnyDict* address = dict;
-    dict = AnyDict("b", 2);
+    Any dict(AnyDict("a", 1)), point(QvPoint(1, 2));
+    const AnyDict* const address = dict;
+    const QvPoint& held = point.asPoint();
     dict = Any(AnyDict("c", 3));
-    EXPECT_EQ(static_cast<AnyDict*>(dict), address);
-    EXPECT_EQ(address->get("c"), 3);
-
-    Any point(QvPoint(1, 2));
-    const QvPoint* held = &point.asPoint();
     point = Any(QvPoint(3, 4));
-    EXPECT_EQ(&point.asPoint(), held);
-    EXPECT_EQ(held->y(), 4);
+    EXPECT_EQ(static_cast<AnyDict*>(dict), address);
+    EXPECT_TRUE(address->get("c") == 3 && held.y() == 4);
 }
 
 TEST(Any, sharedNullRefusesEveryKindOfAssignment) {
     Any& null = Any::null();
-    EXPECT_TRUE(null.isNull());
-    EXPECT_FALSE(null.isValid());
-    EXPECT_EQ(&null, &Any::invalid());
+    EXPECT_TRUE(null.isNull() && !null.isValid() && &null == &Any::invalid());
     for (const Any& value : oneOfEach())
         EXPECT_EQ(failureOf([&] { null = value; }), nullAssignment) << Any::typeName(value.type());
     EXPECT_EQ(failureOf([&] { null = 1; }), nullAssignment);
     EXPECT_EQ(failureOf([&] { null.set("x"); }), nullAssignment);
     EXPECT_EQ(failureOf([&] { null.set(noBytes, 4); }), nullAssignment);
     EXPECT_EQ(failureOf([&] { null.invalidate(); }), nullAssignment);
-    EXPECT_EQ(failureOf([&] { null = null; }), "no failure");
-
-    const Any copy = null;
-    EXPECT_FALSE(copy.isNull());
-    Any moved = std::move(null);
-    EXPECT_FALSE(moved.isNull());
-    EXPECT_TRUE(Any::null().isNull());
-    EXPECT_NE(null, Any());
-    EXPECT_EQ(copy, Any());
+    const Any copy = null, moved = std::move(null);
+    EXPECT_FALSE(copy.isNull() || moved.isNull());
+    EXPECT_TRUE(Any::null().isNull() && Any::null() != Any() && copy == Any());
 }
 
 TEST(Any, textLengthsAndPadding) {
     Any text("abcdef", 3);
     EXPECT_EQ(text, "abc");
-    EXPECT_EQ(text.size(), 3);
-
-    const char* buffer = text.asString();
+    const char* const buffer = text.asString();
     text = "xy";
-    EXPECT_EQ(text.asString(), buffer);
-    EXPECT_EQ(text.size(), 2);
-
+    EXPECT_TRUE(text.asString() == buffer && text.size() == 2);
     text.set("ab", 5);
-    EXPECT_EQ(text.size(), 5);
     EXPECT_EQ(std::string(text.asString(), 6), std::string("ab\0\0\0\0", 6));
-    EXPECT_EQ(Any(text).size(), 2);
-    EXPECT_EQ(Any(std::move(text)).size(), 2);
-
+    EXPECT_TRUE(text.size() == 5 && Any(text).size() == 2 && Any(std::move(text)).size() == 2);
     EXPECT_EQ(failureOf([] { Any(static_cast<const char*>(nullptr)); }), "");
     EXPECT_EQ(failureOf([] { Any("x", -1); }), "");
-}
 
-TEST(Any, wideTextIsMeasuredUpTo65536Units) {
-    const std::vector<unsigned short> units(70000, 'w');
-    const Any given(units.data(), 70000);
-    EXPECT_EQ(given.size(), 70000);
-    EXPECT_EQ(Any(given).size(), 65536);
-    Any source = given;
-    source.set(units.data(), 70000);
-    const Any moved = std::move(source);
-    EXPECT_EQ(moved.size(), 65536);
-    EXPECT_EQ(moved.asWString()[65536], 0);
+    const std::vector<unsigned short> units(70000, 'w');  // a copy measures 65,536 of them
+    Any wideText(units.data(), 70000);
+    EXPECT_TRUE(wideText.size() == 70000 && Any(wideText).size() == 65536);
+    const Any moved = std::move(wideText);
+    EXPECT_TRUE(moved.size() == 65536 && moved.asWString()[65536] == 0);
 }
 
 TEST(Any, genericOwnsBytesOrBorrowsAPointer) {
@@ -153,7 +116,6 @@ TEST(Any, genericOwnsBytesOrBorrowsAPointer) {
     EXPECT_NE(Any(owned).asGeneric(), owned.asGeneric());
     owned.set(noBytes, 4);
     EXPECT_EQ(owned, Any(static_cast<const void*>("\0\0\0\0"), 4));
-
     const Any borrowed(static_cast<const void*>(bytes));
     EXPECT_EQ(borrowed.size(), 0);
     EXPECT_EQ(Any(borrowed).asGeneric(), bytes);
@@ -169,14 +131,11 @@ TEST(Any, numbersIntoOneAnother) {
         long long as64;
         double asDouble;
     } cases[] = {
-        {Any(-7), -7, -7, -7.0},
         {Any(0x1'0000'0002LL), 2, 0x1'0000'0002LL, 4294967298.0},
-        {Any(1.5), 1, 1, 1.5},
         {Any(-1.5), -1, -1, -1.5},
         {Any(1e30), highestInt, std::numeric_limits<long long>::max(), 1e30},
         {Any(-1e30), lowestInt, std::numeric_limits<long long>::min(), -1e30},
         {Any(2147483648.0), highestInt, 2147483648LL, 2147483648.0},
-        {Any(0.25f), 0, 0, 0.25},
     };
     for (const auto& c : cases) {
         EXPECT_EQ(c.value.toInt32(), c.as32) << c.asDouble;
@@ -198,38 +157,23 @@ TEST(Any, readsOfAnotherTypeNeverReachForeignMemory) {
         if (value.isGeneric()) continue;
         SCOPED_TRACE(Any::typeName(value.type()));
         EXPECT_EQ(value.asString() != nullptr, value.isText());
-        EXPECT_EQ(value.asWString() != nullptr, value.isWString());
         EXPECT_EQ(value.asDict().isNull(), !value.isDict());
         EXPECT_EQ(value.asVector().isNull(), !value.isVector());
-        EXPECT_EQ(static_cast<AnyDict*>(value) != nullptr, value.isDict());
         EXPECT_EQ(failureOf([&] { value.asRect(); }), value.isRect() ? "no failure" : "");
         EXPECT_EQ(failureOf([&] { value.asMediaTime(); }), value.isMediaTime() ? "no failure" : "");
     }
     EXPECT_EQ(Any(1.0).asInt64(), 0x3FF0'0000'0000'0000LL);
-    EXPECT_EQ(Any(5).asInt32(9), 5);
-    EXPECT_EQ(Any(5).asInt64(9), 9);
     EXPECT_EQ(Any(5).asFloat(9.0), 9.0);
     EXPECT_STREQ(Any(u"x").asString("other"), "other");
 }
 
 TEST(Any, truth) {
-    int something = 0;
-    const Any yes[] = {Any(-1),         Any(1LL << 40),  Any(nan),
-                       Any("0"),        Any(u"0"),       Any(AnyDict("a", Any())),
-                       AnyVector(0, 0), Any(noBytes, 1), Any(static_cast<const void*>(&something))};
-    const Any no[] = {Any(),
-                      Any(0),
-                      Any(0LL),
-                      Any(-0.0),
-                      Any(""),
-                      Any(u""),
-                      Any(AnyDict()),
-                      Any(AnyVector()),
-                      Any(Pair(1, 1)),
-                      Any(QvFramerate()),
-                      Any(static_cast<const void*>(nullptr))};
-    for (const Any& value : yes) EXPECT_TRUE(value && value.isTrue() && !value.isFalse()) << value.type();
-    for (const Any& value : no) EXPECT_TRUE(!value && !value.isTrue() && value.isFalse()) << value.type();
+    for (const Any& value : anys(-1, 1LL << 40, nan, "0", u"0", AnyDict("a", Any()), AnyVector(0, 0),
+                                 Any(noBytes, 1), static_cast<const void*>("")))
+        EXPECT_TRUE(value && value.isTrue() && !value.isFalse()) << value.type();
+    for (const Any& value :
+         anys(Any(), 0, 0LL, -0.0, "", u"", AnyDict(), AnyVector(), Pair(1, 1), QvFramerate(), Any(noBytes)))
+        EXPECT_TRUE(!value && !value.isTrue() && value.isFalse()) << value.type();
 }
 
 TEST(Any, equalityNeedsTypeSizeAndValue) {
@@ -284,47 +228,33 @@ TEST(Any, substr) {
                  {-5, -5, "h"},    {2, 2, nullptr}, {3, 1, nullptr},  {0, 6, nullptr},
                  {-6, 3, nullptr}, {5, 5, nullptr}, {0, -7, nullptr}, {lowestInt, highestInt, nullptr}};
     for (const auto& c : cases) {
-        SCOPED_TRACE(std::to_string(c.start) + " to " + std::to_string(c.end));
-        for (const Any& text : {Any("hello"), Any(u"hello")}) {
+        for (const Any& text : anys("hello", u"hello")) {
             Any part;
             const auto failure = failureOf([&] { part = text.substr(c.start, c.end); });
-            if (c.result) {
-                EXPECT_EQ(part.toString(), c.result);
-                EXPECT_EQ(part.type(), text.type());
-            } else {
-                EXPECT_EQ(failure, "Any.substr: index out of range");
-            }
+            EXPECT_EQ(failure, c.result ? "no failure" : "Any.substr: index out of range")
+                << c.start << c.end;
+            EXPECT_TRUE(!c.result || (part.toString() == c.result && part.type() == text.type())) << c.start;
         }
     }
-    EXPECT_EQ(Any("").substr(0, 5), "");
-    EXPECT_EQ(Any(u"").substr(3, 2), Any(u""));
+    EXPECT_TRUE(Any("").substr(0, 5) == "" && Any(u"").substr(3, 2) == Any(u""));
     EXPECT_EQ(failureOf([] { Any(1).substr(0, 1); }), "Any.substr: invalid type");
 }
 
 TEST(Any, replace) {
-    const auto many = [](const char* text, int count) {
-        std::string result;
-        while (count-- > 0) result += text;
-        return result;
-    };
     const struct {
         std::string text, find, with, result;
     } cases[] = {
         {"a.b.c", ".", "::", "a::b::c"},
         {"aaa", "aa", "b", "ba"},
         {"xaab", "ab", "b", "xb"},  // each step makes the next occurrence
-        {"ab ab", "ab", "ab", "ab ab"},
-        {"abc", "x", "yyy", "abc"},
         {"baab", "ba", "ab", "aabb"},
         {"", "x", "y", ""},
         {"abc", "", "", "abc"},
-        {"xay", "a", "ab", ("xa" + many("b", 5000)).substr(0, 4095)},
-        {"xay", "a", "ba", std::string("x") + many("b", 4094)},
-        {"q", "", "12", many("12", 2048).substr(0, 4095)},
-        {many("a", 5000), "a", "bb", many("b", 4095)},
-        {many("ab", 9000), "b", "", many("a", 4095)},
-        {many("a", 9000) + "b", "aaa", "", "b"},
-        {many("a", 40) + "b", "ab", "bba", many("b", 4095)},  // doubles with each "a"
+        {"xay", "a", "ab", ("xa" + repeated("b", 5000)).substr(0, 4095)},
+        {"q", "", "12", repeated("12", 2048).substr(0, 4095)},
+        {repeated("a", 5000), "a", "bb", repeated("b", 4095)},
+        {repeated("a", 9000) + "b", "aaa", "", "b"},
+        {repeated("a", 40) + "b", "ab", "bba", repeated("b", 4095)},  // doubles with each "a"
     };
     for (const auto& c : cases) {
         const Any narrow = Any(c.text.c_str()).replace(c.find.c_str(), c.with.c_str());
@@ -342,10 +272,7 @@ TEST(Any, strcatAndSprintf) {
     EXPECT_EQ(Any::strcat("ab", Any(u"cd")), Any(u"abcd"));
     EXPECT_EQ(Any::strcat(Any(1), "x"), Any(u"x"));
     EXPECT_EQ(Any::strcat(Any(), Any()), Any(u""));
-
-    const std::string longText(3000, 'x');
-    EXPECT_EQ(Any::sprintf("%s", longText.c_str()).size(), 2047);
-    EXPECT_EQ(Any::sprintf("%d/%s", 7, "a"), "7/a");
+    EXPECT_EQ(Any::sprintf("%s", std::string(3000, 'x').c_str()).size(), 2047);
 }
 
 }  // namespace

@@ -1,17 +1,13 @@
 #include "core/value/anycontainer.h"
 
-#include <gtest/gtest.h>
-
 #include <algorithm>
 #include <limits>
-#include <random>
-#include <string>
-#include <vector>
 
-#include "tests/core/value/value_support.h"
+#include "tests/support/checks.h"
 
 namespace {
 
+const std::string nullAssignment = "Attempt to assign to Any::null()";
 constexpr double nan = std::numeric_limits<double>::quiet_NaN();
 
 TEST(AnyVector, referencesSurviveAppending) {
@@ -53,45 +49,34 @@ TEST(AnyVector, positionsOutsideTheRange) {
     EXPECT_EQ(failureOf([&] { vector.resize(-1); }), "");
 }
 
-TEST(AnyVector, mayBeAddedToItself) {
+TEST(AnyVector, mayBeAddedToItselfAndCopiesAreDeep) {
     AnyVector vector(1, 2);
     vector.extend(vector);
     vector.append(vector);
     vector.append(vector[0]);
-    EXPECT_EQ(vector, AnyVector(1, 2, 1, 2, AnyVector(1, 2, 1, 2), 1));
-    vector.set(0, Any(vector));
-    EXPECT_EQ(vector[0].size(), 6);
-    vector = vector[0].asVector();
-    EXPECT_EQ(vector.size(), 6);
-}
-
-TEST(AnyVector, copiesAreDeep) {
-    AnyVector vector(AnyVector(1), AnyDict("a", 1));
     const AnyVector copy = vector;
-    vector[0].asVector().append(2);
-    vector[1].asDict().set("a", 2);
-    EXPECT_EQ(copy, AnyVector(AnyVector(1), AnyDict("a", 1)));
+    EXPECT_EQ(copy, AnyVector(1, 2, 1, 2, AnyVector(1, 2, 1, 2), 1));
+    vector[4].asVector().append(3);
+    vector = vector[4].asVector();
+    EXPECT_EQ(vector, AnyVector(1, 2, 1, 2, 3));
+    EXPECT_EQ(copy[4].asVector().size(), 4);
 }
 
 TEST(AnyVector, search) {
     const AnyVector vector(1, "1", 1.0, 1, 2.5, 1);
-    EXPECT_EQ(vector.indexOf(1, -1), 0);
-    EXPECT_EQ(vector.indexOf(1, 0), 3);
-    EXPECT_EQ(vector.find(1, 3), 5);
-    EXPECT_EQ(vector.indexOf(1, 5), -1);
-    EXPECT_EQ(vector.indexOf(1, -100), 0);
-    EXPECT_TRUE(vector.contains(1.0));
-    EXPECT_FALSE(vector.contains(Any(1LL)));
+    const struct { int start, found; } ones[] = {{-1, 0}, {0, 3}, {3, 5}, {5, -1}, {-100, 0}};
+    for (const auto& c : ones) EXPECT_EQ(vector.indexOf(1, c.start), c.found) << c.start;
+    EXPECT_TRUE(vector.contains(1.0) && !vector.contains(Any(1LL)));
     EXPECT_EQ(vector.ffind(1.0, 0.0), -1);  // strictly below
     EXPECT_EQ(vector.ffind(2.4, 0.2), 4);
-
-    EXPECT_EQ(AnyVector(1, 2, 3).nearest(2.4), 1);
-    EXPECT_EQ(AnyVector(1, 2, 3).nearest(1.5), 0);
-    EXPECT_EQ(AnyVector(10LL, 2.0, -3).nearest(-100), 2);
-    EXPECT_EQ(AnyVector(1, 5, "x", 9).nearest(9), 1);  // ends at what is no number
-    EXPECT_EQ(AnyVector("x", 9).nearest(9), -1);
-    EXPECT_EQ(AnyVector().nearest(1), -1);
-    EXPECT_EQ(AnyVector(1, 2).nearest("1"), -1);
+    const struct {
+        AnyVector list;
+        Any to;
+        int place;
+    } nearest[] = {{{1, 2, 3}, 2.4, 1},    {{1, 2, 3}, 1.5, 0},  {{10LL, 2.0, -3}, -100, 2},
+                   {{1, 5, "x", 9}, 9, 1},  // ends at what is no number
+                   {{"x", 9}, 9, -1},      {AnyVector(), 1, -1}, {{1, 2}, "1", -1}};
+    for (const auto& c : nearest) EXPECT_EQ(c.list.nearest(c.to), c.place);
 }
 
 TEST(AnyVector, sortsByTypeThenValue) {
@@ -110,15 +95,12 @@ TEST(AnyVector, sortsByTypeThenValue) {
     EXPECT_EQ(dicts, AnyVector(AnyDict("x", 0), AnyDict("n", 1), AnyDict("n", 2)));
     dicts << 1;
     EXPECT_EQ(failureOf([&] { dicts.sortDicts("n"); }), "");
-    EXPECT_EQ(dicts.size(), 4);
 }
 
 TEST(AnyVector, removesManyByTheirOldPositions) {
     AnyVector vector(0, 1, 2, 3, 4, 5);
     vector.removeMany(AnyVector(1, 5.0, 3LL, 99, -1));
     EXPECT_EQ(vector, AnyVector(0, 2, 4));
-    vector.removeMany(AnyVector());
-    EXPECT_EQ(vector.size(), 3);
 }
 
 TEST(AnyVector, splitAndJoin) {
@@ -131,9 +113,7 @@ TEST(AnyVector, splitAndJoin) {
         {",", ",", AnyVector("", "")},
         {"abc", "", AnyVector(Any("abc"))},
         {"a;,b", ",;", AnyVector("a;", "b")},
-        {"a\xC3\xA9"
-         "b\xC3\xA8",
-         "\xC3\xA9", AnyVector("a", "b\xC3\xA8")},
+        {"a\xC3\xA9!\xC3\xA8", "\xC3\xA9", AnyVector("a", "!\xC3\xA8")},
     };
     for (const auto& c : cases) {
         EXPECT_EQ(Any(c.text).split(c.delimiter), c.pieces) << c.text;
@@ -149,64 +129,38 @@ TEST(AnyVector, splitAndJoin) {
 
     EXPECT_EQ(AnyVector("a", 1, "", "b").join(", "), "a, , b");
     EXPECT_EQ(AnyVector("a", "b", "c").join("a long separator"), "aa long separatorba long separatorc");
-    EXPECT_EQ(AnyVector("a", "b").join(Any()), "ab");
     EXPECT_EQ(AnyVector("a", Any(u"b")).join("-"), Any(u"a-b"));
-    EXPECT_EQ(AnyVector("a", "b").join(Any(u"-")), Any(u"a-b"));
     for (const AnyVector& nothing : {AnyVector(), AnyVector(1, 2), AnyVector("", Any(u""))})
         EXPECT_EQ(nothing.join(","), Any());
 }
 
-TEST(AnyVector, nullSentinelIsNeverWritten) {
-    AnyVector& null = AnyVector::null();
-    EXPECT_TRUE(null.isNull() && null.empty());
-    EXPECT_FALSE(AnyVector().isNull() || AnyVector(null).isNull());
-    EXPECT_EQ(failureOf([&] { null.append(1); }), "");
-    EXPECT_EQ(failureOf([&] { null.append(AnyDict()); }), "");
-    EXPECT_EQ(failureOf([&] { null << 1; }), "");
-    EXPECT_EQ(failureOf([&] { null = AnyVector(1, 2); }), "");
-    EXPECT_EQ(failureOf([&] { null.resize(1); }), "");
-    const AnyVector stolen = std::move(null);
-    EXPECT_TRUE(AnyVector::null().isNull() && !stolen.isNull());
-
-    AnyVector a(1, 2), b;
-    EXPECT_EQ(failureOf([&] { a.swap(null); }), "");
-    a.swap(b);
-    EXPECT_TRUE(a.empty());
-    EXPECT_EQ(b, AnyVector(1, 2));
-}
-
 TEST(AnyDict, orderOfKeys) {
     // Signed bytes: what is not ASCII goes first, but a shorter key always before its continuations.
-    const std::vector<std::string> sorted = {
-        "",          "\x80",      "\x80\x80",   "\xC3\xA9", "\xFF", "0",        "a",
-        "a\x80",     "a\x80\x80", "a\x80\x01",  "a\x01",    "ab",   "abcdefgh", "abcdefgh\xC3",
-        "abcdefgh!", "abcdefghi", "abcdefghij", "abcdefgi", "b"};
-    std::mt19937 random(7);
-    auto shuffled = sorted;
-    std::ranges::shuffle(shuffled, random);
+    const Texts sorted = {"",           "\x80",     "\x80\x80",  "\xC3\xA9",     "\xFF",      "0",
+                          "a",          "a\x80",    "a\x80\x80", "a\x80\x01",    "a\x01",     "aacd",
+                          "ab",         "abcd",     "abcdefgh",  "abcdefgh\xC3", "abcdefgh!", "abcdefghi",
+                          "abcdefghij", "abcdefgi", "b"};
     AnyDict dict;
-    for (const auto& key : shuffled) dict.set(key.c_str(), key.c_str());
-    ASSERT_EQ(dict.size(), static_cast<int>(sorted.size()));
-    int position = 0;
-    for (auto [key, value] : dict) {
-        EXPECT_EQ(key, sorted[static_cast<std::size_t>(position)]);
-        EXPECT_EQ(*value, key);
-        EXPECT_STREQ(dict.getKey(position), key);
-        ++position;
+    for (std::size_t i = 0; i < sorted.size(); ++i) {
+        const std::string& key = sorted[i * 5 % sorted.size()];
+        dict.set(key.c_str(), key.c_str());
     }
-    for (const auto& key : sorted) EXPECT_EQ(dict.get(key.c_str()), key.c_str());
+    Texts keys;
+    for (auto [key, value] : dict) {
+        EXPECT_EQ(*value, key);
+        EXPECT_EQ(dict.get(key), key);
+        keys.push_back(key);
+    }
+    EXPECT_EQ(keys, sorted);
 }
 
 TEST(AnyDict, longKeysAreCutWhenSetOnly) {
     const std::string key(41, 'k');
-    AnyDict dict;
-    dict.set(key.c_str(), 1);
+    AnyDict dict(key.c_str(), 1);
     dict.set((key + "other").c_str(), 2);
-    EXPECT_EQ(dict.size(), 1);
-    EXPECT_FALSE(dict.isSet(key.c_str()));
-    EXPECT_EQ(dict.get(key.substr(0, 40).c_str()), 2);
     dict.remove(key.c_str());
-    EXPECT_EQ(dict.size(), 1);
+    EXPECT_FALSE(dict.isSet(key.c_str()));
+    EXPECT_EQ(dict, AnyDict(key.substr(0, 40).c_str(), 2));
 }
 
 TEST(AnyDict, lookupsNeverInsert) {
@@ -223,21 +177,14 @@ TEST(AnyDict, lookupsNeverInsert) {
 }
 
 TEST(AnyDict, typedReadsAreExact) {
-    const AnyDict dict("i", 1, "l", 2LL, "f", 3.0, "s", "t", "w", Any(u"u"), "v", AnyVector(1, 2), "d",
-                       AnyDict("x", 1));
-    EXPECT_EQ(dict.getInt32("i", 9), 1);
-    EXPECT_EQ(dict.getInt64("i", 9), 9);
-    EXPECT_EQ(dict.getInt64("l", 9), 2);
-    EXPECT_EQ(dict.getInt32("f", 9), 9);
-    EXPECT_EQ(dict.getFloat("f", 9), 3.0);
-    EXPECT_EQ(dict.getDouble("i", 9), 9.0);
+    const AnyDict dict("i", 1, "l", 2LL, "f", 3.0, "s", "t", "w", Any(u"u"), "v", AnyVector(1, 2));
+    EXPECT_TRUE(dict.getInt32("i", 9) == 1 && dict.getInt64("l", 9) == 2 && dict.getFloat("f", 9) == 3.0);
+    EXPECT_TRUE(dict.getInt64("i", 9) == 9 && dict.getInt32("f", 9) == 9 && dict.getDouble("i", 9) == 9.0);
     EXPECT_STREQ(dict.getString("s", "z"), "t");
     EXPECT_STREQ(dict.getString("w", "z"), "z");
     EXPECT_EQ(dict.getWString("w")[0], 'u');
-    EXPECT_EQ(dict.getVector("v").size(), 2);
-    EXPECT_TRUE(dict.getVector("d").isNull());
-    EXPECT_EQ(dict.getDict("d").getInt32("x"), 1);
-    EXPECT_TRUE(dict.getDict("none").isNull());
+    EXPECT_TRUE(dict.getVector("v").size() == 2 && dict.getVector("i").isNull());
+    EXPECT_TRUE(dict.getDict("v").isNull());
 }
 
 TEST(AnyDict, valuesMayHoldTheDictionaryOrComeFromIt) {
@@ -252,73 +199,58 @@ TEST(AnyDict, valuesMayHoldTheDictionaryOrComeFromIt) {
     outer.update(outer["in"].asDict());
     EXPECT_EQ(outer, AnyDict("in", 7, "other", 8));
     outer.update(outer);
-    EXPECT_EQ(outer.size(), 2);
-    AnyDict parent("child", AnyDict("x", 1));
-    parent = parent["child"].asDict();
-    EXPECT_EQ(parent, AnyDict("x", 1));
+    outer.set("in", AnyDict("x", 1));
+    outer = outer["in"].asDict();
+    EXPECT_EQ(outer, AnyDict("x", 1));
 }
 
 TEST(AnyDict, positions) {
     AnyDict dict("b", 2, "a", 1);
-    EXPECT_STREQ(dict.getKey(0), "a");
     dict.getVal(1) = 22;
-    EXPECT_EQ(dict["b"], 22);
-    EXPECT_EQ(dict.find(22), 1);
-    EXPECT_EQ(dict.find("22"), -1);
     Any key, value;
     dict.getKeyVal(1, key, value);
-    EXPECT_TRUE(key == "b" && value == 22);
+    EXPECT_TRUE(key == "b" && value == 22 && dict.find(22) == 1 && dict.find("22") == -1);
     for (int outside : {-1, 2}) {
         EXPECT_EQ(dict.getKey(outside), nullptr);
-        EXPECT_TRUE(dict.getVal(outside).isNull());
+        EXPECT_TRUE(dict.getVal(outside).isNull() && dict.getEntry(outside).value->isNull());
         EXPECT_EQ(dict.at(outside).key, nullptr);
-        EXPECT_TRUE(dict.getEntry(outside).value->isNull());
         dict.getKeyVal(outside, key, value);
         EXPECT_TRUE(key == Any() && value == Any());
     }
 }
 
-TEST(AnyDict, nullSentinelIsNeverWritten) {
-    AnyDict& null = AnyDict::null();
-    EXPECT_TRUE(null.isNull() && null.empty() && null.begin() == null.end());
-    EXPECT_FALSE(AnyDict().isNull() || AnyDict(null).isNull());
-    EXPECT_EQ(failureOf([&] { null.set("a", 1); }), "");
-    EXPECT_EQ(failureOf([&] { null = AnyDict("a", 1); }), "");
-    EXPECT_EQ(failureOf([&] { null.update(AnyDict("a", 1)); }), "");
-    EXPECT_EQ(AnyDict(), AnyDict::null());
+TEST(AnyContainers, nullSentinelsAreNeverWritten) {
+    AnyVector &null = AnyVector::null(), a(1, 2), b;
+    AnyDict& nullDict = AnyDict::null();
+    EXPECT_EQ(failureOf([&] { null.append(1); }), "");
+    EXPECT_EQ(failureOf([&] { null.append(AnyDict()); }), "");
+    EXPECT_EQ(failureOf([&] { null = AnyVector(1, 2); }), "");
+    EXPECT_EQ(failureOf([&] { null.resize(1); }), "");
+    EXPECT_EQ(failureOf([&] { a.swap(null); }), "");
+    EXPECT_EQ(failureOf([&] { nullDict.set("a", 1); }), "");
+    EXPECT_EQ(failureOf([&] { nullDict = AnyDict("a", 1); }), "");
+    EXPECT_EQ(failureOf([&] { nullDict.update(AnyDict("a", 1)); }), "");
+    const AnyVector stolen = std::move(null);
+    EXPECT_TRUE(AnyVector::null().isNull() && AnyVector::null().empty() && !stolen.isNull());
+    EXPECT_TRUE(nullDict.isNull() && nullDict.begin() == nullDict.end() && AnyDict() == nullDict);
+    EXPECT_FALSE(AnyVector().isNull() || AnyDict().isNull() || AnyDict(nullDict).isNull());
+    a.swap(b);
+    EXPECT_TRUE(a.empty() && b == AnyVector(1, 2));
 }
 
 TEST(Descendant, paths) {
     AnyDict dict("a", AnyVector(0, 1, AnyDict("b", "found", "", 5)), "n", 1, "", AnyDict("e", 6));
     const struct {
-        const char* path;
-        const char* type;  // null: nothing there
-    } cases[] = {
-        {"a.2.b", "String"},
-        {"a.", "Vector"},
-        {"a", "Vector"},
-        {"a.1", "Int32"},
-        {"a.2.b.", "String"},
-        {"a.2..", "Int32"},
-        {".e", "Int32"},
-        {"a.-1", nullptr},
-        {"a.3", nullptr},
-        {"n.x", nullptr},
-        {"", nullptr},
-        {"x", nullptr},
-        {"a.2.b.c", nullptr},
-        {".", "Dict"},
-        {"a.1x", "Int32"},
-        {"a.x", "Int32"},
-        {"a.99999999999999999999", nullptr},
-        {"a.+2.b", "String"},
-    };
+        const char *path, *type;  // type null: nothing there
+    } cases[] = {{"a.2.b", "String"},  {"a.", "Vector"},     {"a", "Vector"},
+                 {"a.1", "Int32"},     {"a.2.b.", "String"}, {"a.2..", "Int32"},
+                 {".e", "Int32"},      {"a.-1", nullptr},    {"a.3", nullptr},
+                 {"n.x", nullptr},     {"", nullptr},        {"x", nullptr},
+                 {"a.2.b.c", nullptr}, {".", "Dict"},        {"a.1x", "Int32"},
+                 {"a.x", "Int32"},     {"a.+2.b", "String"}, {"a.99999999999999999999", nullptr}};
     for (const auto& c : cases) {
-        const Any* found = dict.descendant("%s", c.path);
-        ASSERT_EQ(found != nullptr, c.type != nullptr) << c.path;
-        if (found) {
-            EXPECT_STREQ(Any::typeName(found->type()), c.type) << c.path;
-        }
+        const Any* const found = dict.descendant("%s", c.path);
+        EXPECT_STREQ(found ? Any::typeName(found->type()) : nullptr, c.type) << c.path;
     }
     EXPECT_EQ(dict.descendant(nullptr), nullptr);
     AnyVector vector(AnyDict("k", AnyVector(7, 8)));

@@ -1,38 +1,20 @@
 #include "core/value/xmldom.h"
 
-#include <gtest/gtest.h>
-
 #include <cstdio>
 #include <memory>
-#include <string>
-#include <vector>
 
-#include "core/engine/qvexception.h"
-#include "tests/core/value/value_support.h"
+#include "tests/support/checks.h"
 #include "tests/support/temp_folder.h"
 
 namespace {
 
-std::string repeated(std::string_view text, std::size_t count) {
-    std::string result;
-    while (count-- > 0) result += text;
-    return result;
-}
-
-// What parsing fails with, without the file's name; empty if it does not fail.
+// What parsing fails with, without the file's name.
 std::string parseFailure(const std::string& document, XmlParser* parser = nullptr) {
     const TempFolder folder;
     XmlParser own;
-    const std::string file = folder.write("a.xml", document);
-    try {
-        EXPECT_EQ((parser ? parser : &own)->parseFile(file.c_str()), 0);
-        return "";
-    } catch (const QvFileException& failure) {
-        std::string text = failure.what();
-        const std::string start = "Error in xml file " + file + " ";
-        EXPECT_TRUE(text.starts_with(start)) << text;
-        return text.substr(std::min(text.size(), start.size()));
-    }
+    const std::string file = folder.write("a.xml", document), start = "Error in xml file " + file + " ";
+    const std::string text = failureOf([&] { (parser ? parser : &own)->parseFile(file.c_str()); });
+    return text.starts_with(start) ? text.substr(start.size()) : text;
 }
 
 std::string written(const XmlNode& node, int indent = 0) {
@@ -47,13 +29,10 @@ std::string written(const XmlNode& node, int indent = 0) {
 TEST(XmlNode, dataGrowsAndFormats) {
     const char* attrs[] = {"b", "2", "a", "\xC3\xA9", nullptr};
     XmlNode node("n", attrs, nullptr, "abc");
-    EXPECT_EQ(node.getAttr("b"), "2");
-    EXPECT_EQ(node.getAttr("a"), Any(u"\u00e9"));
-    EXPECT_TRUE(node.getAttr("c").isNull());
+    EXPECT_TRUE(node.getAttr("b") == "2" && node.getAttr("a") == Any(u"\u00e9") &&
+                node.getAttr("c").isNull());
     node.addRawData("defgh", 2);
     EXPECT_EQ(node.rawData(), "abcde");
-    EXPECT_EQ(node.dataSize(), 5);
-
     const std::string longText(2000, 'x');
     node.sprintf("%s", longText.c_str());
     EXPECT_EQ(node.dataSize(), 511);
@@ -62,7 +41,6 @@ TEST(XmlNode, dataGrowsAndFormats) {
     node.sprintf("%s%d", longText.c_str(), 12);
     EXPECT_EQ(node.dataSize(), 2002);  // more room since the data has grown
     node.sprintf("%s", "");
-    EXPECT_EQ(node.rawData(), "");
     EXPECT_STREQ(node.data(), "");
     node.addRawData("\xC3\xA4");
     EXPECT_EQ(node.rawData(), Any(u"\u00e4"));
@@ -73,18 +51,12 @@ TEST(XmlNode, childrenAndNames) {
     auto* first = new XmlNode("x:a", nullptr, &root);
     new XmlNode(nullptr, nullptr, &root);
     auto* third = new XmlNode("a:b:c", nullptr, first);
-    EXPECT_EQ(root.nrChildren(), 2);
-    EXPECT_EQ(root.child("x:a"), first);
-    EXPECT_EQ(root.child("none"), nullptr);
+    EXPECT_TRUE(root.nrChildren() == 2 && root.child("x:a") == first && !root.child("none"));
     EXPECT_EQ(failureOf([&] { root.child(2); }), "");
-    EXPECT_EQ(root.child(1)->name(), nullptr);
-
     root.stripXMLNamespace(false);
-    EXPECT_STREQ(root.name(), "root");
-    EXPECT_STREQ(first->name(), "x:a");
+    EXPECT_EQ(root.name() + std::string(first->name()), "rootx:a");
     root.stripXMLNamespace(true);
-    EXPECT_STREQ(first->name(), "a");
-    EXPECT_STREQ(third->name(), "a:b:c");
+    EXPECT_EQ(first->name() + std::string(third->name()), "aa:b:c");
     root.deleteChildren();
     EXPECT_EQ(root.nrChildren(), 0);
 }
@@ -113,53 +85,44 @@ TEST(XmlNode, writtenForm) {
 
 TEST(XmlParser, buildsTheTree) {
     XmlParser parser;
-    EXPECT_EQ(parser.topLevel(), nullptr);
     const std::string document =
         "<?xml version=\"1.0\"?>\n<!DOCTYPE r SYSTEM \"nowhere.dtd\">\n<!-- c --><r k='&lt;&#233;'>x<a></a>\n"
         "y<![CDATA[<&>]]><b><c/></b></r>";
-    EXPECT_EQ(parseFailure(document, &parser), "");
+    EXPECT_EQ(parseFailure(document, &parser), "no failure");
     const XmlNode& root = *parser.topLevel();
     EXPECT_STREQ(root.name(), "r");
     EXPECT_EQ(root.getAttr("k"), Any(u"<\u00e9"));
     EXPECT_EQ(root.rawData(), "x\ny<&>");
     EXPECT_STREQ(root.child("b")->child(0)->name(), "c");
     EXPECT_EQ(root.child("a")->rawData(), "");
-
-    EXPECT_EQ(parseFailure("<other \xC3\xA4='1'><\xC3\xA4/></other>", &parser), "");
-    EXPECT_STREQ(parser.topLevel()->name(), "other");
+    EXPECT_EQ(parseFailure("<other \xC3\xA4='1'><\xC3\xA4/></other>", &parser), "no failure");
     EXPECT_EQ(parser.topLevel()->getAttr("\xC3\xA4"), "1");
     EXPECT_STREQ(parser.topLevel()->child(0)->name(), "\xC3\xA4");
-
-    EXPECT_NE(parseFailure("<a><b></a>", &parser), "");
+    EXPECT_EQ(parseFailure("<a><b></a>", &parser), "mismatched tag at line 1");
     EXPECT_EQ(parser.topLevel(), nullptr);
 }
 
 TEST(XmlParser, blocksOfTheReader) {
-    for (std::size_t size : {63999u, 64000u, 64001u, 128000u}) {
-        const std::string frame = "<a></a>";
+    for (int size : {63999, 64000, 64001, 128000}) {
         XmlParser parser;
-        EXPECT_EQ(parseFailure("<a>" + std::string(size - frame.size(), 'x') + "</a>", &parser), "") << size;
-        EXPECT_EQ(parser.topLevel()->dataSize(), static_cast<int>(size - frame.size()));
+        parseFailure("<a>" + std::string(static_cast<std::size_t>(size - 7), 'x') + "</a>", &parser);
+        EXPECT_EQ(parser.topLevel()->dataSize(), size - 7);
     }
 }
 
 TEST(XmlParser, damagedDocumentsTellReasonAndLine) {
-    struct Case {
+    const struct {
         std::string document, failure;
-    };
-    const std::string billion = "<!DOCTYPE a [\n<!ENTITY x \"ha\">\n<!ENTITY y \"&x;&x;\">]>\n<a>&y;</a>";
-    const Case cases[] = {
+    } cases[] = {
         {"", "no element found at line 1"},
         {"\n\n<a>\n<b>", "no element found at line 4"},
         {"<a>\n<b>\n</a>", "mismatched tag at line 3"},
-        {"<a/>\n<b/>", "junk after document element at line 2"},
         {std::string("<a>x\0y</a>", 10), "not well-formed (invalid token) at line 1"},
-        {"<a>\xFF</a>", "not well-formed (invalid token) at line 1"},
-        {"<a b='1' b='2'/>", "duplicate attribute at line 1"},
         {"<?xml version='1.0' encoding='x-none'?><a/>", "unknown encoding at line 1"},
         {"<a>\n&nothing;</a>", "undefined entity at line 2"},
         {"<!DOCTYPE a SYSTEM 'x.dtd'>\n<a>&nothing;</a>", "undefined entity at line 2"},
-        {billion, "entity declarations are not allowed at line 2"},
+        {"<!DOCTYPE a [\n<!ENTITY x \"ha\">\n<!ENTITY y \"&x;&x;\">]>\n<a>&y;</a>",
+         "entity declarations are not allowed at line 2"},
         {"<!DOCTYPE a [<!ENTITY x SYSTEM 'file:///etc/passwd'>]><a>&x;</a>",
          "entity declarations are not allowed at line 1"},
         {"<!DOCTYPE a [<!ENTITY % p SYSTEM 'file:///etc/passwd'> %p;]><a/>",
@@ -175,25 +138,17 @@ TEST(XmlParser, damagedDocumentsTellReasonAndLine) {
         {"<r>\n" + repeated("<gen>40000000x 00 </gen>\n", 3) + "</r>", "binary data too large at line 3"},
     };
     for (const auto& c : cases) EXPECT_EQ(parseFailure(c.document), c.failure) << c.document.substr(0, 60);
-
-    XmlParser parser;
-    try {
-        parser.parseFile("/nowhere/a.xml");
-        FAIL();
-    } catch (const QvFileException& failure) {
-        EXPECT_STREQ(failure.what(), "Can not open file /nowhere/a.xml");
-    }
+    EXPECT_EQ(failureOf([] { XmlParser().parseFile("/nowhere/a.xml"); }), "Can not open file /nowhere/a.xml");
 }
 
 TEST(XmlParser, largeAndDeepDocumentsWithinTheLimits) {
     const std::string name(1 << 20, 'n');
     XmlParser parser;
-    EXPECT_EQ(parseFailure("<" + name + " a='" + name + "'/>", &parser), "");
-    EXPECT_EQ(parser.topLevel()->name(), name);
+    EXPECT_EQ(parseFailure("<" + name + " a='" + name + "'/>", &parser), "no failure");
     EXPECT_EQ(parser.topLevel()->getAttr("a").size(), 1 << 20);
 
     const std::size_t depth = XmlParser::maxDepth;
-    EXPECT_EQ(parseFailure(repeated("<a>", depth) + repeated("</a>", depth), &parser), "");
+    EXPECT_EQ(parseFailure(repeated("<a>", depth) + repeated("</a>", depth), &parser), "no failure");
     const TempFolder folder;
     EXPECT_EQ(XmlParser::storeXmlTree(folder.file("deep.xml").c_str(), parser.topLevel(), nullptr), 0);
     EXPECT_EQ(parser.parseFile(folder.file("deep.xml").c_str()), 0);
@@ -213,36 +168,25 @@ TEST(XmlParser, storesWhatItCanReadAgain) {
     parser.parseFile(Any(file.c_str()).toWString());
     EXPECT_EQ(parser.topLevel()->getAttr("v"), root.getAttr("v"));
 
-    const auto storeFailure = [&](XmlNode* node, const std::string& to) -> std::string {
-        try {
-            XmlParser::storeXmlTree(to.c_str(), node, nullptr);
-            return "";
-        } catch (const QvFileException& failure) {
-            return failure.what();
-        }
+    const auto storeFailure = [](XmlNode& node, const std::string& to) {
+        return failureOf([&] { XmlParser::storeXmlTree(to.c_str(), &node, nullptr); });
     };
     for (const char* bad : {"", "a b", "1a", "a>", "-", "#x", "\xC3\x97", "\xFF"}) {
         new XmlNode(bad, nullptr, &root);
-        EXPECT_EQ(storeFailure(&root, file), "Can not store '" + file + "': invalid name '" + bad + "'");
+        EXPECT_EQ(storeFailure(root, file), "Can not store '" + file + "': invalid name '" + bad + "'");
         root.deleteChildren();
     }
     new XmlNode("\xC3\xA4", nullptr, &root);
-    EXPECT_EQ(storeFailure(&root, folder.file("name.xml")), "");
+    EXPECT_EQ(storeFailure(root, folder.file("name.xml")), "no failure");
     root.setAttr("a b", "x");
-    EXPECT_EQ(storeFailure(&root, file), "Can not store '" + file + "': invalid attribute 'a b'");
+    EXPECT_EQ(storeFailure(root, file), "Can not store '" + file + "': invalid attribute 'a b'");
     EXPECT_EQ(TempFolder::read(file), bytes);
-
-    XmlNode deep("a");
-    for (XmlNode* node = &deep; deep.nrChildren() < 1 || node->name()[0] != 'z';) {
-        static int count = 0;
-        node = new XmlNode(++count < 2000 ? "a" : "z", nullptr, node);
-    }
-    EXPECT_EQ(storeFailure(&deep, file), "Can not store '" + file + "': elements nested too deep");
-    EXPECT_EQ(storeFailure(&deep, "/nowhere/a.xml"),
-              "Can not store '/nowhere/a.xml': elements nested too deep");
-    XmlNode plain("plain");
-    EXPECT_EQ(storeFailure(&plain, "/nowhere/a.xml"), "Can not open '/nowhere/a.xml' for writing");
-    EXPECT_EQ(storeFailure(&plain, "/dev/full"), "Can not write '/dev/full'");
+    XmlNode deep("a"), plain("plain");
+    XmlNode* innermost = &deep;
+    for (int i = 0; i < 2000; ++i) innermost = new XmlNode("a", nullptr, innermost);
+    EXPECT_EQ(storeFailure(deep, file), "Can not store '" + file + "': elements nested too deep");
+    EXPECT_EQ(storeFailure(plain, "/nowhere/a.xml"), "Can not open '/nowhere/a.xml' for writing");
+    EXPECT_EQ(storeFailure(plain, "/dev/full"), "Can not write '/dev/full'");
 }
 
 TEST(XmlParser, standardStreamsStayOpen) {

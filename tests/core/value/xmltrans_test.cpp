@@ -1,18 +1,12 @@
 #include "core/value/xmltrans.h"
 
-#include <gtest/gtest.h>
-
-#include <algorithm>
 #include <cmath>
 #include <limits>
 #include <memory>
-#include <random>
-#include <string>
-#include <vector>
 
-#include "core/engine/qvexception.h"
 #include "core/media/qvgeometry.h"
-#include "tests/core/value/value_support.h"
+#include "tests/support/checks.h"
+#include "tests/support/comma_locale.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/temp_folder.h"
 
@@ -61,7 +55,6 @@ TEST(XmlTrans, dataOfEachType) {
         {Any(1.0 / 3), "fl", "0.333333"},
         {Any(-1e15), "fl", "-1000000000000000.000000"},
         {Any(std::numeric_limits<double>::infinity()), "fl", "inf"},
-        {Any(" a\t"), "str", " a\t"},
         {Any(u"\u00e9"), "wstr", "\xC3\xA9"},
         {bytes(std::string(10, '\xAB')), "gen", "10x AB "},
         {bytes("\x01\x02\x03"), "gen", "01 02 03 "},
@@ -104,17 +97,14 @@ TEST(XmlTrans, attributesOfEachType) {
 }
 
 TEST(XmlTrans, readsDamagedValues) {
-    constexpr int max32 = std::numeric_limits<int>::max();
     constexpr double infinity = std::numeric_limits<double>::infinity();
     const struct {
         const char* element;
         Any value;
     } cases[] = {
         {"<i32> \n\t+12 apples</i32>", Any(12)},
-        {"<i32>-</i32>", Any(0)},
         {"<i32>+-3</i32>", Any(0)},
-        {"<i32/>", Any(0)},
-        {"<i32>99999999999999999999</i32>", Any(max32)},
+        {"<i32>99999999999999999999</i32>", Any(std::numeric_limits<int>::max())},
         {"<i32>-99999999999999999999</i32>", Any(std::numeric_limits<int>::min())},
         {"<i64>12345678901234567890</i64>", Any(std::numeric_limits<long long>::max())},
         {"<i64>NaN</i64>", Any(0LL)},
@@ -123,20 +113,16 @@ TEST(XmlTrans, readsDamagedValues) {
         {"<fl>1e-999</fl>", Any(0.0)},
         {"<fl>0.0001e-100000</fl>", Any(0.0)},
         {"<fl> 1,5</fl>", Any(1.0)},
-        {"<fl>.5e1x</fl>", Any(5.0)},
         {"<fl>-inf</fl>", Any(-infinity)},
-        {"<fl>none</fl>", Any(0.0)},
         {"<str/>", Any("")},
         {"<wstr>x</wstr>", Any(u"x")},
         {"<inv>x</inv>", Any()},
         {"<gen>3x</gen>", bytes(std::string(2, 0))},
         {"<gen>-7x AA 1</gen>", bytes("\x01")},
-        {"<gen>2x 3x 0F 7</gen>", bytes(std::string("\x03\x03\x0F\x07\0", 5).substr(0, 5))},
         {"<gen>zz 1FF</gen>", bytes(std::string("\0\xFF", 2))},
         {"<pt x='1'/>", Any()},
         {"<rect left='1' top='2' right='3'/>", Any()},
         {"<pair second='2'/>", Pair(0, 2)},
-        {"<bitrate target='5'/>", Any()},
         {"<bitrate type='7'/>", QvBitrate(7, 7)},
         {"<bitrate type='bad' max='9'/>", QvBitrate(0, 0, 0, 9)},
         {"<mediatime ticks='5'/>", Any()},
@@ -145,7 +131,6 @@ TEST(XmlTrans, readsDamagedValues) {
         {"<framerate/>", QvFramerate(25.0)},
         {"<framerate num='1' denom='0'/>", QvFramerate(QvRatio(1, 0))},
         {"<vec><i32>1</i32><x><y/></x><str>s</str></vec>", AnyVector(1, Any(), "s")},
-        {"<Foo/>", AnyDict("__class__", "Foo")},
         {"<Foo name='lost'/>", AnyDict("__class__", "Foo")},
         {"<Foo><bar/></Foo>", Any()},
         {"<dict class='C' version='2' name='N'><x/><key>k</key></dict>",
@@ -157,15 +142,11 @@ TEST(XmlTrans, readsDamagedValues) {
     };
     for (const auto& c : cases) EXPECT_EQ(valueOf(c.element), c.value) << c.element;
     EXPECT_TRUE(std::isnan(valueOf("<fl>NaN</fl>").asFloat()));
-    EXPECT_EQ(valueOf("<framerate num='50' df='1'/>").asFramerate().df(), true);
-}
-
-TEST(XmlTrans, missingPartsOfARateAreLogged) {
     const LogCapture log;
-    valueOf("<framerate denom='1' df='0'/>");
-    EXPECT_TRUE(log.contains("[xmlnode] Invalid framerate node, missing'num'", 32));
-    EXPECT_TRUE(log.contains("[xmlnode] Invalid framerate node, missing 'pulldown'", 32));
-    EXPECT_FALSE(log.contains("'denom'"));
+    EXPECT_TRUE(valueOf("<framerate denom='1' df='1'/>").asFramerate().df());
+    EXPECT_EQ(log.texts(), (Texts{"[xmlnode] Invalid framerate node, missing'num'",
+                                  "[xmlnode] Invalid framerate node, missing 'interlaced'",
+                                  "[xmlnode] Invalid framerate node, missing 'pulldown'"}));
 }
 
 TEST(XmlTrans, placeOfTheClass) {
@@ -174,10 +155,8 @@ TEST(XmlTrans, placeOfTheClass) {
         const char *given, *name, *attribute;
     } cases[] = {
         {AnyDict("__class__", "Foo"), nullptr, "Foo", nullptr},
-        {AnyDict("__class__", "Foo"), "Foo", "Foo", nullptr},
         {AnyDict("__class__", "Foo"), "Bar", "Bar", "Foo"},
         {AnyDict("__class__", "i32"), nullptr, "dict", "i32"},
-        {AnyDict("__class__", "a b"), nullptr, "dict", "a b"},
         {AnyDict("#c", 1), nullptr, "dict", nullptr},
     };
     for (const auto& c : cases) {
@@ -189,89 +168,30 @@ TEST(XmlTrans, placeOfTheClass) {
     }
 }
 
-// Random values that a document can hold without loss.
-class RandomValues {
-  public:
-    explicit RandomValues(unsigned seed) : random_(seed) {}
-
-    Any value(int depth) {
-        switch (number(depth > 0 ? 15 : 13)) {
-            case 0: return Any();
-            case 1: return Any(integer());
-            case 2: return Any(static_cast<long long>(random_()) << 32 | integer());
-            case 3: return Any(integer() / 64.0);
-            case 4: return Any(text().c_str());
-            case 5: return Any(text().c_str()).toWString();
-            case 6: return bytes(runs());
-            case 7:
-                return QvFramerate(QvRatio(1 + number(60000), 1 + number(1001)), number(3), number(2) == 1);
-            case 8: return QvPoint(integer(), integer());
-            case 9: return QvRect(integer(), integer(), integer(), integer());
-            case 10: return QvBitrate(number(6), integer(), integer(), integer(), integer());
-            case 11: return Pair(integer(), integer());
-            case 12: return MediaTime(static_cast<long long>(random_()) << 30, 1 + number(1 << 30));
-            case 13: return vector(depth - 1);
-            default: return dict(depth - 1);
-        }
-    }
-
-    AnyVector vector(int depth) {
-        AnyVector result;
-        for (int i = number(5); i > 0; --i) result.append(value(depth));
-        return result;
-    }
-
-    AnyDict dict(int depth) {
-        AnyDict result("some", value(0));  // with a class alone, the attributes of an element are not read
-        for (int i = number(6); i > 0; --i) {
-            const std::string key = text();
-            if (!key.starts_with('#')) result.set(key.c_str(), value(depth));
-        }
-        if (number(2)) result.set("__class__", classes[static_cast<std::size_t>(number(5))]);
-        if (number(2)) result.set("__version__", number(2) ? Any("7") : Any(Pair(7, 8)));
-        if (number(2)) result.set("name", number(2) ? Any("n<>") : Any(5));
-        return result;
-    }
-
-  private:
-    static constexpr const char* classes[] = {"Foo", "a b", "key", "\xC3\xA4", "vec"};
-    std::mt19937 random_;
-
-    int number(int bound) { return static_cast<int>(random_() % static_cast<unsigned>(bound)); }
-    int integer() { return static_cast<int>(random_()); }
-    // Ends before a key would be cut. No carriage return: XML turns it into a line feed.
-    std::string text() {
-        static constexpr const char* parts[] = {
-            "a", "Z",  "7", " ", "\n", "\t",  "<",        ">",
-            "&", "\"", "'", "#", "_",  "]]>", "\xC3\xA9", "\xF0\x9F\x8E\xAC",
-            "%s"};
-        std::string result;
-        for (int i = number(10); i > 0; --i) result += parts[random_() % std::size(parts)];
-        return result;
-    }
-    std::string runs() {
-        std::string result(1, static_cast<char>(random_()));
-        for (int i = number(8); i > 0; --i)
-            result.append(static_cast<std::size_t>(number(6)), static_cast<char>(random_()));
-        return result;
-    }
-};
-
-TEST(XmlTrans, randomDictionariesSurviveStoringAndRestoring) {
+TEST(XmlTrans, hostileTextsSurviveStoringAndRestoringInEveryPlace) {
     const TempFolder folder;
-    const std::string first = folder.file("1.xml"), second = folder.file("2.xml");
-    for (unsigned seed = 0; seed < 300; ++seed) {
-        AnyDict dict = RandomValues(seed).dict(4);
-        dict.set("__class__", "Root");  // any other does not outlive the root's name
-        ASSERT_EQ(XmlParser::storeDict(first.c_str(), dict), 0);
-        AnyDict back;
-        Any root, version;
-        ASSERT_EQ(XmlParser::restoreDict(first.c_str(), back, root, version), 0);
-        ASSERT_EQ(XmlParser::storeDict(second.c_str(), back), 0);
-        ASSERT_EQ(TempFolder::read(first), TempFolder::read(second)) << "seed " << seed;
-        if (!dict.get("__version__").isPair()) dict.set("__version__", version);
-        ASSERT_EQ(back, dict) << "seed " << seed << "\n" << TempFolder::read(first);
-    }
+    const std::string file = folder.file("1.xml"), again = folder.file("2.xml");
+    const Any texts[] = {"",   " ",  "\n\tz ", "<&>\"'", "]]>", "##",  "_",   "\xC3\xA9\xF0\x9F\x8E\xAC",
+                         "%s", "42", "key",    "ent",    "val", "vec", "Foo", "a b"};
+    for (const Any& text : texts)
+        for (const Any& version : {Any(), Any("7"), Any(Pair(7, 8))}) {
+            const Any attribute = text == "\n\tz " ? Any("z") : text;  // XML makes line ends there spaces
+            AnyDict inner("some", QvPoint(-1, 2), "__class__", attribute, "name", attribute),
+                plain("none", Any());
+            if (version.isValid()) inner.set("__version__", version);
+            plain.set(Any::strcat("k", text).asString(),
+                      AnyVector(text, bytes("\1\1\1"), inner, AnyVector()));
+            if (text != "##") plain.set(text.asString(), text.toWString());
+            const AnyDict dict("__class__", "Root", "__version__", "2", "in", inner, "p", AnyVector(1, plain),
+                               "name", 5);
+            ASSERT_EQ(XmlParser::storeDict(file.c_str(), dict), 0);
+            AnyDict back;
+            Any root, found;
+            ASSERT_EQ(XmlParser::restoreDict(file.c_str(), back, root, found), 0);
+            EXPECT_EQ(back, dict) << TempFolder::read(file);
+            ASSERT_EQ(XmlParser::storeDict(again.c_str(), back), 0);
+            EXPECT_EQ(TempFolder::read(file), TempFolder::read(again));
+        }
 }
 
 TEST(XmlTrans, numbersIgnoreTheLocale) {
@@ -304,10 +224,8 @@ TEST(StoreDict, classAndVersion) {
         Any version;
         std::string start;  // of the root element; empty: refused
     } cases[] = {
-        {AnyDict("a", 1), "C", Any(3), "<C version=\"3\">"},
         {AnyDict("a", 1), "C", Any(1LL << 40), "<C version=\"1099511627776\">"},
         {AnyDict("a", 1), "C", Any(1.5), "<C version=\"1.500000\">"},
-        {AnyDict("a", 1), "C", Any("x"), "<C version=\"x\">"},
         {AnyDict("a", 1), "C", Any(0), "<C version=\"2.0\">"},
         {AnyDict("a", 1), "C", Pair(1, 2), "<C version=\"2.0\">"},
         {AnyDict("__class__", "D", "__version__", 4), nullptr, Any(), "<D version=\"4\"/>"},
@@ -358,7 +276,6 @@ TEST(XmlTransCustomDict, compactFormAndBack) {
     EXPECT_STREQ(node.name(), "Clip");
     EXPECT_EQ(node.attrs(), AnyDict("version", "1", "name", "N"));
     EXPECT_TRUE(node.child("n")->getAttr("type") == "i32" && node.child("n")->rawData() == "1");
-    EXPECT_EQ(node.child("#note")->getAttr("type"), "str");
     EXPECT_EQ(node.child("v")->child(1)->child("x")->getAttr("type"), "i32");
     AnyDict back;
     XmlTransCustomDict().XmlToDict(&node, back);

@@ -1,16 +1,20 @@
-// What the tests of values share.
+// What most tests of the core use: GoogleTest, names of both widths, and the text of a failure.
 #pragma once
 
 #include <gtest/gtest.h>
 
 #include <ostream>
 #include <string>
+#include <vector>
 
+#include "core/arch/widename.h"
 #include "core/engine/qvexception.h"
 #include "core/value/anycontainer.h"
-#include "tests/support/comma_locale.h"
 
-// The text of the assertion that an action fails with, without its location; "no failure" if there is none.
+using Texts = std::vector<std::string>;
+
+// The text of the engine's exception that an action ends with, of an assertion only the message behind the
+// place; "no failure" if there is none.
 template <class Action>
 std::string failureOf(Action action) {
     try {
@@ -19,11 +23,20 @@ std::string failureOf(Action action) {
         const std::string text = failure.what();
         const auto message = text.find(": \n");
         return message == std::string::npos ? "" : text.substr(message + 3);
+    } catch (const QvException& failure) {
+        return failure.what();
     }
     return "no failure";
 }
 
-inline const std::string nullAssignment = "Attempt to assign to Any::null()";
+inline Any narrow(const std::string& name) { return Any(name.c_str()); }
+inline Any wide(const std::string& name) { return Any(qv_wide_name(name).c_str()); }
+
+inline std::string repeated(std::string_view text, std::size_t count) {
+    std::string result;
+    while (count-- > 0) result += text;
+    return result;
+}
 
 inline void PrintTo(const Any& value, std::ostream* out) {
     *out << Any::typeName(value.type()) << " of size " << value.size();
