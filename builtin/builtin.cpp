@@ -31,7 +31,7 @@ constexpr QvBuiltinRow registered[] = {
     {"rawvenc",      videoEncoder, "RAW/YUV encoder",                "RAW/YUV",                    newRawvenc,
      {.inFourcc = "BGR4 BGR3 I420 YUY2 YV12 Y216"}},
     {"rawaenc",      audioEncoder, "RAW Wave audio encoder module",  "RAW Wave Audio",             newRawaenc},
-    {"frconvert",    videoFilter,  "Framerate converter",            "Change framerate",           nullptr},
+    {"frconvert",    videoFilter,  "Framerate converter",            "Change framerate",           newFrconvert},
     {"srconvert",    audioFilter,  "Samplerate converter",           "Change samplerate",          nullptr},
     {"deinterlace",  videoFilter,  "Field deinterlace",              "Deinterlace",                newDeinterlace},
     {"logo",         videoFilter,  "Insert logo into frame",         "Logo",                       nullptr},

@@ -28,3 +28,4 @@ QvCodec* newScaler();
 QvCodec* newDeinterlace();
 QvCodec* newTimecode();
 QvCodec* newSubtitle();
+QvCodec* newFrconvert();

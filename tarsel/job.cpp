@@ -223,7 +223,7 @@ void Job::planLengths() {
         if (stream.type == kVideo) {
             const QvRatio from = inRate.asFramerate().rate();
             stream.inUnits = stream.out.position(from) - stream.in.position(from);
-            stream.expected = QvRatio::multyplyByRatio(stream.inUnits, from, stream.rate.rate());
+            stream.expected = QvRatio::multyplyByRatio(stream.inUnits, stream.rate.rate(), from);
             // A whole number of pairs goes into a halving.
             if (std::abs(2.0 * stream.rate.rate() - static_cast<double>(from)) < 1e-4 && stream.inUnits % 2)
                 stream.expected = (stream.inUnits + 1) / 2;
