@@ -35,7 +35,7 @@ constexpr QvBuiltinRow registered[] = {
     {"srconvert",    audioFilter,  "Samplerate converter",           "Change samplerate",          nullptr},
     {"deinterlace",  videoFilter,  "Field deinterlace",              "Deinterlace",                newDeinterlace},
     {"logo",         videoFilter,  "Insert logo into frame",         "Logo",                       nullptr},
-    {"bobber",       videoFilter,  "Auto bob",                       "Auto bob",                   nullptr},
+    {"bobber",       videoFilter,  "Auto bob",                       "Auto bob",                   newBobber},
     {"cropper",      videoFilter,  "Crop filter",                    "Crop/pad",                   nullptr},
     {"timecode",     videoFilter,  "Timecode inserter",              "Timecode",                   newTimecode},
     {"subimport",    decoder,      "Text subtitle importer",         "Subtitle import",            newSubimport,

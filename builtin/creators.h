@@ -29,3 +29,4 @@ QvCodec* newDeinterlace();
 QvCodec* newTimecode();
 QvCodec* newSubtitle();
 QvCodec* newFrconvert();
+QvCodec* newBobber();

@@ -36,4 +36,10 @@ struct RateStages {
 
 RateStages chooseRateStages(const QvFramerate& in, const QvFramerate& out);
 
+// Frames that leave these filters for each one that enters: a filter that makes several progressive frames of
+// one answers with their number to "_rateFactor".
+int rateFactor(const VideoFilters& filters);
+// The rate times `by` / `over`, with its flags.
+QvFramerate scaledRate(const QvFramerate& rate, int by, int over);
+
 }  // namespace qvchain

@@ -1,4 +1,7 @@
 // Which converters change a frame rate, and whether they may run before the scaler.
+#include <algorithm>
+#include <limits>
+
 #include "core/filter/chainfilters_p.h"
 #include "core/media/qvgeometry.h"
 #include "core/media/qvratio.h"
@@ -50,6 +53,27 @@ RateStages chooseRateStages(const QvFramerate& in, const QvFramerate& out) {
     RateStages stages;
     stages.main = newStage(in, out);
     return stages;
+}
+
+int rateFactor(const VideoFilters& filters) {
+    constexpr int most = 1 << 10;
+    int factor = 1;
+    for (const auto& filter : filters)
+        factor =
+            std::clamp(factor * std::clamp(filter->getParam("_rateFactor").asInt32(1), 1, most), 1, most);
+    return factor;
+}
+
+QvFramerate scaledRate(const QvFramerate& rate, int by, int over) {
+    QvFramerate scaled = rate;
+    long long num = static_cast<long long>(rate.rate().num) * by;
+    long long den = static_cast<long long>(rate.rate().den) * over;
+    QvRatio::reduce64(num, den);
+    if (std::max(num, den) <= std::numeric_limits<int>::max())
+        scaled.setRate(QvRatio(static_cast<int>(num), static_cast<int>(den)));
+    else
+        scaled.setRate(static_cast<double>(num) / static_cast<double>(den));
+    return scaled;
 }
 
 }  // namespace qvchain

@@ -51,6 +51,8 @@ class VideoChain {
     int width_;  // of the picture at this place of the chain
     int height_;
     bool interlaced_;
+    bool reducesRate_ = false;
+    int backFactor_ = 1;  // of the rate, by custom filters at the end
     VideoFilterPtr flipper_, cropper_, deinterlace_, scaler_;
     qvchain::RateStages rate_;
     qvchain::VideoFilters front_, back_;
@@ -58,13 +60,13 @@ class VideoChain {
 
 // Everything that a job needs; false when it needs nothing.
 bool VideoChain::plan() {
+    planCustom();
     flipper_ = restoreFixed("flipper");
     planCropper();
     planDeinterlace();
     dropField();
     planScaler();
     planRate();
-    planCustom();
     return scaler_ || rate_.main || flipper_ || deinterlace_ || cropper_ || !front_.empty() || !back_.empty();
 }
 
@@ -112,7 +114,7 @@ void VideoChain::planDeinterlace() {
 
 // When scaling would throw half the lines away anyway, one field serves.
 void VideoChain::dropField() {
-    if (job_.outFramerate.interlaced() != 0 || !interlaced_ || deinterlace_) return;
+    if (job_.outFramerate.interlaced() != 0 || !interlaced_ || deinterlace_ || backFactor_ > 1) return;
     if (job_.outHeight > height_ / 2) return;
     deinterlace_ = qvchain::newVideoFilter("deinterlace");
     if (!deinterlace_) return;
@@ -149,11 +151,18 @@ void VideoChain::planScaler() {
     scaler_->setParam("outITU", direction == Matrix::bt709To601 ? 1 : 2);
 }
 
+// A filter that makes two frames of each interlaced one does its part of the conversion.
 void VideoChain::planRate() {
-    if (std::fabs(job_.inFramerate.rate().ratio() - job_.outFramerate.rate().ratio()) <= sameRate) return;
-    QvFramerate in = job_.inFramerate;
+    QvFramerate in = qvchain::scaledRate(job_.inFramerate, qvchain::rateFactor(front_), 1);
+    QvFramerate out = job_.outFramerate;
     if (!interlaced_) in.setInterlaced(0);
-    rate_ = qvchain::chooseRateStages(in, job_.outFramerate);
+    if (backFactor_ > 1) {
+        out = qvchain::scaledRate(out, 1, backFactor_);
+        out.setInterlaced(in.interlaced());
+    }
+    const double difference = in.rate().ratio() - out.rate().ratio();
+    reducesRate_ = difference > 0;
+    if (std::fabs(difference) > sameRate) rate_ = qvchain::chooseRateStages(in, out);
 }
 
 void VideoChain::planCustom() {
@@ -164,6 +173,8 @@ void VideoChain::planCustom() {
     QvUtil::getSortedEffects(custom.asVector(), front, back, true);
     front_ = qvchain::restoreVideoFilters(front);
     back_ = qvchain::restoreVideoFilters(back);
+    backFactor_ = qvchain::rateFactor(back_);
+    if (qvchain::rateFactor(front_) > 1) interlaced_ = false;
 }
 
 void VideoChain::append(QvVProcessPipe& pipe, VideoFilterPtr filter) const {
@@ -172,10 +183,8 @@ void VideoChain::append(QvVProcessPipe& pipe, VideoFilterPtr filter) const {
 
 void VideoChain::fill(QvVProcessPipe& pipe) {
     for (auto& filter : front_) append(pipe, std::move(filter));
-    const double in = job_.inFramerate.rate();
-    const double out = job_.outFramerate.rate();
     // A rate reduction runs first, so that no frame is scaled in vain.
-    if (in > out && !rate_.behindScaler) append(pipe, std::move(rate_.main));
+    if (reducesRate_ && !rate_.behindScaler) append(pipe, std::move(rate_.main));
     append(pipe, std::move(flipper_));
     append(pipe, std::move(cropper_));
     append(pipe, std::move(deinterlace_));
