@@ -6,7 +6,7 @@
 
 #include "core/engine/qvexception.h"
 #include "tests/core/decode/fake_decoder.h"
-#include "tests/core/value/value_support.h"
+#include "tests/support/checks.h"
 #include "tests/support/log_capture.h"
 
 namespace {

@@ -1,11 +1,9 @@
 #include "core/engine/codepages.h"
 
-#include <gtest/gtest.h>
-
 #include <set>
-#include <string>
 
 #include "core/arch/platform.h"
+#include "tests/support/checks.h"
 
 namespace {
 

@@ -1,14 +1,7 @@
-#include <gtest/gtest.h>
-
-#include <string>
-
-#include "core/arch/widename.h"
-#include "core/engine/qvexception.h"
 #include "core/engine/qvfileutil.h"
+#include "tests/support/checks.h"
 
 namespace {
-
-Any wide(const std::string& text) { return Any(qv_wide_name(text).c_str()); }
 
 // The bytes of a result, with its width checked against the argument's.
 std::string text(const Any& result, bool isWide = false) {
@@ -22,19 +15,15 @@ TEST(FileNames, PartsAreTheSameInBothWidths) {
         const char *name, *path, *file, *base, *ext, *stripped;
     } cases[] = {
         {"a.TXT", "", "a.TXT", "a", "TXT", "a"},
-        {"a.b.c", "", "a.b.c", "a.b", "c", "a.b"},
         {"dir.v1/a", "dir.v1/", "a", "a", "", "dir.v1/a"},
         {"/a/b.c", "/a/", "b.c", "b", "c", "/a/b"},
-        {"\\a\\b.c", "\\a\\", "b.c", "b", "c", "\\a\\b"},
         {"a\\b/c.d", "a\\b/", "c.d", "c", "d", "a\\b/c"},
         {"c:file.x", "c:/", "file.x", "file", "x", "c:file"},
         {"c:\\", "c:\\", "", "", "", "c:\\"},
-        {"c:\\x\\y", "c:\\x\\", "y", "y", "", "c:\\x\\y"},
         {"a.", "", "a.", "a", "", "a."},
         {".", "", ".", "", "", "."},
         {".x", "", ".x", "", "x", ""},
         {"..", "", "..", ".", "", ".."},
-        {"a", "", "a", "a", "", "a"},
         {"", "", "", "", "", ""},
         {"/", "/", "", "", "", "/"},
         {"d/\xC3\xA9\xFF.y", "d/", "\xC3\xA9\xFF.y", "\xC3\xA9\xFF", "y", "d/\xC3\xA9\xFF"},
@@ -59,15 +48,12 @@ TEST(FileNames, JoiningTakesTheFirstSeparatorThatAppears) {
         bool isWide = false;
     } cases[] = {
         {AnyVector("a/", "/b"), "a/b"},
-        {AnyVector("a\\x", "b/c"), "a\\x\\b\\c"},
         {AnyVector("a", "b\\c", "d"), "a\\b\\c\\d"},
-        {AnyVector("a", "b"), "a/b"},
         {AnyVector("/", "a"), "/a"},
         {AnyVector("//", "a"), "//a"},
         {AnyVector("", "/a", "b"), "/a/b"},
         {AnyVector("a", "", "//", "b//"), "a/b"},
         {AnyVector("a", 7, "b"), "a/b"},
-        {AnyVector("a/", "b/"), "a/b"},
         {AnyVector("", ""), ""},
         {AnyVector("a", u"\u00e9"), "a/\xC3\xA9", true},
         {AnyVector(u"a", "\xFF"), "a/\xFF", true},
@@ -85,27 +71,23 @@ TEST(FileNames, ExtensionsAreJoinedAndChangedInTheNamesWidth) {
     EXPECT_EQ(text(QvFile::joinExt("", "x")), ".x");
     EXPECT_EQ(text(QvFile::changeExt("/dir.v1/a", "png")), "/dir.v1/a.png");
     EXPECT_EQ(text(QvFile::changeExt("a.b.c", "png")), "a.b.png");
-    EXPECT_EQ(text(QvFile::changeExt("/a.b", "c")), "/a.c");
     EXPECT_EQ(text(QvFile::changeExt(u"x/a.b", "c"), true), "x/a.c");
 }
 
 TEST(FileNames, AbsoluteMeansALeadingSeparatorOrADrive) {
-    for (const char* name : {"/", "\\x", "c:", "c:x", "ab:/c", "1:2"})
-        EXPECT_TRUE(QvFile::isAbsolutePath(name)) << name;
-    for (const char* name : {"a", "a/b:c", ":a", "a\\:", ":"})
-        EXPECT_FALSE(QvFile::isAbsolutePath(name)) << name;
-    EXPECT_TRUE(QvFile::isAbsolutePath(u"/a"));
-    EXPECT_THROW(QvFile::isAbsolutePath(""), QvAssertFailure);
-    EXPECT_THROW(QvFile::isAbsolutePath(u""), QvAssertFailure);
+    for (const char* name : {"/", "\\x", "c:", "ab:/c", "1:2"})
+        EXPECT_TRUE(QvFile::isAbsolutePath(name) && QvFile::isAbsolutePath(wide(name))) << name;
+    for (const char* name : {"a", "a/b:c", ":a", "a\\:"})
+        EXPECT_FALSE(QvFile::isAbsolutePath(name) || QvFile::isAbsolutePath(wide(name))) << name;
+    for (const Any& empty : {narrow(""), wide("")})
+        EXPECT_THROW(QvFile::isAbsolutePath(empty), QvAssertFailure);
 }
 
 TEST(FileNames, SeparatorsAreUnifiedInPlaceOnlyWhereTheyDiffer) {
-    Any name = "a/b\\c";
+    Any name = "a/b\\c", number = 3;
     EXPECT_TRUE(QvFile::setSeparator(name, '\\'));
     EXPECT_EQ(text(name), "a\\b\\c");
-    EXPECT_FALSE(QvFile::setSeparator(name, '\\'));
-    Any number = 3;
-    EXPECT_FALSE(QvFile::setSeparator(number, '/'));
+    EXPECT_FALSE(QvFile::setSeparator(name, '\\') || QvFile::setSeparator(number, '/'));
     EXPECT_EQ(text(QvFile::osFname("a\\b/c")), "a/b/c");
     EXPECT_EQ(text(QvFile::osFname(std::string(2000, 'x').c_str())), std::string(1023, 'x'));
 }
@@ -120,29 +102,21 @@ TEST(FileNames, EscapingCoversTheFourteenAndQuotingEverything) {
 }
 
 TEST(FileNames, WhatIsNoTextIsMisuse) {
-    const Any number = 5;
     const struct {
         const char* message;
         void (*call)(const Any&);
     } cases[] = {
-        {"QvFile.getExt: filename argument must be string", [](const Any& a) { QvFile::getExt(a, true); }},
-        {"QvFile.stripExt: filename argument must be string", [](const Any& a) { QvFile::stripExt(a); }},
-        {"QvFile.joinExt: filename argument must be string", [](const Any& a) { QvFile::joinExt(a, "x"); }},
-        {"QvFile.joinExt: extension argument must be string", [](const Any& a) { QvFile::joinExt("x", a); }},
-        {"QvFile.getFilename: invalid argument type", [](const Any& a) { QvFile::getFilename(a); }},
-        {"QvFile.getBasename: invalid argument type", [](const Any& a) { QvFile::getBasename(a); }},
-        {"QvFile.isAbsolutePath: invalid argument type", [](const Any& a) { QvFile::isAbsolutePath(a); }},
-        {"QvFile.mkpath: argument must be string", [](const Any& a) { QvFile::mkpath(a); }},
+        {"getExt: filename argument must be string", [](const Any& a) { QvFile::getExt(a, true); }},
+        {"stripExt: filename argument must be string", [](const Any& a) { QvFile::stripExt(a); }},
+        {"joinExt: filename argument must be string", [](const Any& a) { QvFile::joinExt(a, "x"); }},
+        {"joinExt: extension argument must be string", [](const Any& a) { QvFile::joinExt("x", a); }},
+        {"getFilename: invalid argument type", [](const Any& a) { QvFile::getFilename(a); }},
+        {"getBasename: invalid argument type", [](const Any& a) { QvFile::getBasename(a); }},
+        {"isAbsolutePath: invalid argument type", [](const Any& a) { QvFile::isAbsolutePath(a); }},
+        {"mkpath: argument must be string", [](const Any& a) { QvFile::mkpath(a); }},
     };
-    for (const auto& c : cases) {
-        try {
-            c.call(number);
-            ADD_FAILURE() << c.message;
-        } catch (QvAssertFailure& failure) {
-            EXPECT_NE(std::string(failure.what()).find(c.message), std::string::npos) << failure.what();
-        }
-    }
-    EXPECT_THROW(qvfopen(number, "r"), QvAssertFailure);
+    for (const auto& c : cases) EXPECT_EQ(failureOf([&] { c.call(5); }), std::string("QvFile.") + c.message);
+    EXPECT_THROW(qvfopen(5, "r"), QvAssertFailure);
 }
 
 }  // namespace

@@ -1,13 +1,11 @@
 #include "core/engine/params.h"
 
-#include <gtest/gtest.h>
-
 #include <climits>
 #include <cmath>
 #include <limits>
-#include <string>
 
 #include "core/media/qvgeometry.h"
+#include "tests/support/checks.h"
 
 namespace {
 
@@ -64,97 +62,54 @@ Any get(const Settings& s, const char* name) {
 }
 
 TEST(Params, NumbersAreCheckedAtTheDoor) {
-    const double infinity = std::numeric_limits<double>::infinity();
+    const double infinity = std::numeric_limits<double>::infinity(), nan = std::nan("");
     const struct {
         const char* name;
-        Any value;
-        bool accepted;
+        AnyVector accepted, refused;
     } cases[] = {
-        {"frames", Any(1), true},
-        {"frames", Any(1000), true},
-        {"frames", Any(0), false},
-        {"frames", Any(1001), false},
-        {"frames", Any(30LL), true},
-        {"frames", Any((1LL << 32) + 30), false},  // its low half would fit
-        {"frames", Any(30.9), true},
-        {"frames", Any(3e9), false},
-        {"frames", Any(std::nan("")), false},
-        {"frames", Any("30"), false},
-        {"frames", Any(), false},
-        {"frames", Any(AnyVector(Any(1))), false},
-        {"offset", Any(LLONG_MAX), true},
-        {"offset", Any(9.3e18), false},
-        {"offset", Any(-9.3e18), false},
-        {"mask", Any(-1), false},
-        {"mask", Any(0xFFFFFFFFLL), true},
-        {"mask", Any(4294967296.0), false},
-        {"gain", Any(8), true},
-        {"gain", Any(8.0001), false},
-        {"gain", Any(infinity), false},
-        {"gain", Any(std::nan("")), false},
-        {"invert", Any(2), true},
-        {"invert", Any(0.5), true},
-        {"invert", Any("false"), false},
-        {"rate", Any(25), true},
-        {"rate", Any(29.97), true},
-        {"rate", Any(0), false},
-        {"rate", Any(-25.0), false},
-        {"rate", Any(std::nan("")), false},
-        {"rate", Any(infinity), false},
-        {"rate", Any(1e300), false},
-        {"rate", Any(1e-9), false},
-        {"rate", Any(QvFramerate(50.0)), true},
-        {"extra", Any(AnyDict("a", 1)), true},
-        {"extra", Any(1), false},
-        {"title", Any(5), false},
-        {"title", Any(), true},
-        {"double", Any("8"), false},
+        {"frames", {1, 1000, 30LL, 30.9}, {0, 1001, (1LL << 32) + 30, 3e9, nan, "30", Any()}},
+        {"offset", {LLONG_MAX, -2.9}, {9.3e18, -9.3e18}},
+        {"mask", {0xFFFFFFFFLL, 0}, {-1, 4294967296.0}},
+        {"gain", {8, 0}, {8.0001, infinity, nan}},
+        {"invert", {2, 0.5}, {"false", Any()}},
+        {"rate", {25, 29.97, QvFramerate(50.0)}, {0, -25.0, nan, infinity, 1e300, 1e-9}},
+        {"extra", {AnyDict("a", 1), AnyDict()}, {1, Any()}},
+        {"title", {Any(), "x"}, {5, AnyDict()}},
+        {"double", {8, 0}, {"8", 1.0}},
     };
     for (const auto& c : cases) {
         Settings s;
-        const Any before = get(s, c.name);
-        EXPECT_EQ(set(s, c.name, c.value), c.accepted ? QvStatus::ok : QvStatus::invalidParam)
-            << c.name << " case " << (&c - cases);
-        EXPECT_TRUE(c.accepted || get(s, c.name) == before) << c.name << " case " << (&c - cases);
+        for (const Any& value : c.refused) {
+            const Any before = get(s, c.name);
+            EXPECT_EQ(set(s, c.name, value), QvStatus::invalidParam)
+                << c.name << testing::PrintToString(value);
+            EXPECT_EQ(get(s, c.name), before);
+        }
+        for (const Any& value : c.accepted)
+            EXPECT_EQ(set(s, c.name, value), QvStatus::ok) << c.name << testing::PrintToString(value);
     }
 }
 
-TEST(Params, FloatsLoseTheirFraction) {
+TEST(Params, ValuesAreConverted) {
     Settings s;
     set(s, "frames", 30.9);
     set(s, "offset", -2.9);
-    EXPECT_EQ(s.frames, 30);
-    EXPECT_EQ(s.offset, -2);
-}
-
-TEST(Params, WideTextBecomesUtf8) {
-    Settings s;
     set(s, "title", Any(u"caf\u00E9"));
-    EXPECT_EQ(s.title, "caf\xC3\xA9");
+    set(s, "mask", 0xFFFFFFFFLL);
+    EXPECT_TRUE(s.frames == 30 && s.offset == -2 && s.title == "caf\xC3\xA9" && s.mask == 0xFFFFFFFFu);
+    EXPECT_EQ(get(s, "mask"), 0xFFFFFFFFLL);
     set(s, "title", Any());
     EXPECT_EQ(s.title, "");
 }
 
-TEST(Params, LargeUnsignedComesBackAsItWas) {
-    Settings s;
-    set(s, "mask", 0xFFFFFFFFLL);
-    EXPECT_EQ(s.mask, 0xFFFFFFFFu);
-    Settings copy;
-    EXPECT_EQ(set(copy, "mask", get(s, "mask")), QvStatus::ok);
-    EXPECT_EQ(copy.mask, s.mask);
-}
-
 TEST(Params, FlagsDecideWhoMayAsk) {
     Settings s;
-    EXPECT_EQ(set(s, "unknown", 1), std::nullopt);
-    EXPECT_EQ(set(s, nullptr, 1), std::nullopt);
-    EXPECT_EQ(set(s, "count", 1), std::nullopt);
-    EXPECT_EQ(set(s, "view", 1), std::nullopt);
+    for (const char* none : {"unknown", "count", "view", static_cast<const char*>(nullptr)})
+        EXPECT_EQ(set(s, none, 1), std::nullopt);
     EXPECT_EQ(set(s, "old", "anything"), QvStatus::ok);
     EXPECT_EQ(set(s, "secret", 3), QvStatus::ok);
     EXPECT_EQ(set(s, "double", 8), QvStatus::ok);
-    EXPECT_EQ(get(s, "count"), 4);
-    EXPECT_EQ(get(s, "double"), 8);
+    EXPECT_TRUE(get(s, "count") == 4 && get(s, "double") == 8);
     for (const char* hidden : {"unknown", "old", "secret"}) EXPECT_FALSE(get(s, hidden).isValid()) << hidden;
 }
 
@@ -169,13 +124,10 @@ TEST(Params, StateHoldsStoredRowsOnly) {
     Settings other;
     other.offset = 9;
     EXPECT_EQ(qvRestoreParamRows<Settings>(rows, other, state), QvStatus::ok);
-    EXPECT_EQ(other.frames, 50);
-    EXPECT_EQ(other.half, 3);
-    EXPECT_EQ(other.offset, 9);
+    EXPECT_TRUE(other.frames == 50 && other.half == 3 && other.offset == 9);
     EXPECT_EQ(qvRestoreParamRows<Settings>(rows, other, AnyDict("frames", 5000, "gain", 2.0)),
               QvStatus::invalidParam);
-    EXPECT_EQ(other.frames, 50);
-    EXPECT_EQ(other.gain, 2.0);
+    EXPECT_TRUE(other.frames == 50 && other.gain == 2.0);
 }
 
 TEST(Params, RefusalSaysWhatIsTaken) {
@@ -185,7 +137,6 @@ TEST(Params, RefusalSaysWhatIsTaken) {
         const char* text;
     } cases[] = {
         {"frames", Any(5000), "'frames' takes an integer from 1 to 1000, not 5000"},
-        {"frames", Any("many"), "'frames' takes an integer from 1 to 1000, not \"many\""},
         {"gain", Any(-0.5), "'gain' takes a number from 0 to 8, not -0.5"},
         {"mask", Any(-1), "'mask' takes an integer from 0 to 4294967295, not -1"},
         {"offset", Any(), "'offset' takes an integer, not a value of type Invalid"},

@@ -1,11 +1,8 @@
-#include <gtest/gtest.h>
-
 #include <cstdint>
-#include <string>
-#include <vector>
 
 #include "core/engine/qvutil.h"
 #include "core/media/qvgeometry.h"
+#include "tests/support/checks.h"
 #include "tests/support/comma_locale.h"
 #include "tests/support/log_capture.h"
 
@@ -32,7 +29,7 @@ TEST(ParamTrace, EveryTypeHasItsForm) {
     for (const auto& c : cases) {
         log.clear();
         QvUtil::debugOutAny("v", c.value, 0, 16);
-        EXPECT_EQ(log.texts(), std::vector<std::string>{c.line});
+        EXPECT_EQ(log.texts(), Texts{c.line});
         EXPECT_EQ(log.lines()[0].mask, QvLogMask::debug);
     }
     log.clear();
@@ -40,9 +37,8 @@ TEST(ParamTrace, EveryTypeHasItsForm) {
     const QvBitrate bits(QvBitrate::cbr, 1000000);
     QvUtil::debugOutAny("r", rate, 0, 0);
     QvUtil::debugOutAny("b", bits, 0, 0);
-    EXPECT_EQ(log.texts(),
-              (std::vector<std::string>{std::string("r [Framerate] = ") + rate.desc(true, true).asString(),
-                                        std::string("b [Bitrate] = ") + bits.desc().asString()}));
+    EXPECT_EQ(log.texts(), (Texts{std::string("r [Framerate] = ") + rate.desc(true, true).asString(),
+                                  std::string("b [Bitrate] = ") + bits.desc().asString()}));
 }
 
 TEST(ParamTrace, NumbersIgnoreTheLocale) {
@@ -51,14 +47,14 @@ TEST(ParamTrace, NumbersIgnoreTheLocale) {
     LogCapture log;
     QvUtil::debugOutAny("v", Any(1.5), 0, 0);
     qv_dbg()->info("%.2f", 0.25);
-    EXPECT_EQ(log.texts(), (std::vector<std::string>{"v [Float] = 1.500000", "0.25"}));
+    EXPECT_EQ(log.texts(), (Texts{"v [Float] = 1.500000", "0.25"}));
 }
 
 TEST(ParamTrace, ContainersFollowOneLevelDeeper) {
     const AnyDict inner("x", 1, "y", AnyVector(Any("a"), Any(2)));
     LogCapture log;
     QvUtil::debugOutAny("top", inner, 1, 20);
-    EXPECT_EQ(log.texts(), (std::vector<std::string>{
+    EXPECT_EQ(log.texts(), (Texts{
                                "  top [Dict] ",
                                "    x [Int32]       = 1",
                                "    y [Vector] ",
@@ -67,10 +63,10 @@ TEST(ParamTrace, ContainersFollowOneLevelDeeper) {
                            }));
     log.clear();
     QvUtil::debugOutAny("top", inner, 0, 20, false);
-    EXPECT_EQ(log.texts(), std::vector<std::string>{"top [Dict] "});
+    EXPECT_EQ(log.texts(), Texts{"top [Dict] "});
     log.clear();
     QvUtil::debugOutDict(AnyDict("k", 1.0));
-    EXPECT_EQ(log.texts(), std::vector<std::string>{"k [Float]                               = 1.000000"});
+    EXPECT_EQ(log.texts(), Texts{"k [Float]                               = 1.000000"});
 }
 
 }  // namespace

@@ -1,10 +1,7 @@
 #include "core/engine/qvexception.h"
 
-#include <gtest/gtest.h>
-
-#include <string>
-
 #include "core/value/qvassert.h"
+#include "tests/support/checks.h"
 #include "tests/support/log_capture.h"
 
 namespace {
@@ -19,23 +16,19 @@ TEST(Exception, NullTextGivesTheDefaultOfEachClass) {
 TEST(Exception, TextIsCutBetweenCharacters) {
     EXPECT_EQ(std::string(QvParamException(std::string(2000, 'x').c_str()).what()), std::string(1023, 'x'));
     // An e with acute takes two bytes: the 512th would end at 1,024.
-    std::string accented;
-    for (int i = 0; i < 600; ++i) accented += "\xC3\xA9";
+    const std::string accented = repeated("\xC3\xA9", 600);
     EXPECT_EQ(std::string(QvException(accented.c_str()).what()), accented.substr(0, 1022));
 }
 
 TEST(Exception, CopiesOwnTheirText) {
     QvException copy(nullptr);
-    {
-        const QvAssertFailure original("gone");
-        copy = original;
-    }
+    copy = QvAssertFailure("gone");
     const QvException second(copy);
     copy = copy;
-    EXPECT_STREQ(static_cast<const char*>(second), "gone");
     EXPECT_STREQ(copy.what(), "gone");
     copy = QvException(nullptr);
     EXPECT_STREQ(copy.what(), "Tarsel exception");
+    EXPECT_STREQ(static_cast<const char*>(second), "gone");
 }
 
 template <class Act>
@@ -45,7 +38,7 @@ std::string assertionText(Act act) {
     } catch (const QvException& failure) {
         return failure.what();
     }
-    return "nothing thrown";
+    return "";
 }
 
 TEST(Assertion, ThrowsAndLogsPlaceAndMessage) {

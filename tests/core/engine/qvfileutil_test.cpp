@@ -1,15 +1,13 @@
 #include "core/engine/qvfileutil.h"
 
 #include <fcntl.h>
-#include <gtest/gtest.h>
 #include <sys/stat.h>
 
-#include <cstdlib>
 #include <ctime>
 #include <filesystem>
 
-#include "core/arch/widename.h"
 #include "core/media/datetime.h"
+#include "tests/support/checks.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/platform_scope.h"
 #include "tests/support/temp_folder.h"
@@ -17,9 +15,6 @@
 namespace {
 
 namespace fs = std::filesystem;
-
-Any narrow(const std::string& name) { return Any(name.c_str()); }
-Any wide(const std::string& name) { return Any(qv_wide_name(name).c_str()); }
 
 // Everything is asked for by narrow and by wide names.
 class FileUtil : public testing::TestWithParam<Any (*)(const std::string&)> {
@@ -32,14 +27,15 @@ INSTANTIATE_TEST_SUITE_P(Widths, FileUtil, testing::Values(narrow, wide),
 
 TEST_P(FileUtil, FilesWithAnyBytesInTheirNamesOpenAndGo) {
     for (const char* file : {"plain", "\xC3\xA9\xF0\x9F\x8E\xAC", "\xFF\xC3", "a'b \"c\n"}) {
-        void* const stream = qvfopen(name(file), "wb");
+        void* const stream = qvfopen(name(file), "wb+");
         ASSERT_NE(stream, nullptr) << file;
-        std::fputs("12345", static_cast<std::FILE*>(stream));
-        EXPECT_EQ(QvFile::ftell64(stream), 5);
-        EXPECT_EQ(std::fclose(static_cast<std::FILE*>(stream)), 0);
-        EXPECT_TRUE(fs::exists(temp.file(file)));
-        EXPECT_TRUE(QvFile::isFile(name(file)));
-        EXPECT_EQ(QvFile::flength(name(file)), 5);
+        std::fputs("0123456789", static_cast<std::FILE*>(stream));
+        EXPECT_EQ(QvFile::fseek64(stream, 4, SEEK_SET), 0);
+        EXPECT_EQ(QvFile::flength(stream), 10);  // and the place stays
+        EXPECT_EQ(QvFile::ftell64(stream), 4);
+        std::fclose(static_cast<std::FILE*>(stream));
+        EXPECT_TRUE(fs::exists(temp.file(file)) && QvFile::isFile(name(file)));
+        EXPECT_EQ(QvFile::flength(name(file)), 10);
         EXPECT_EQ(QvFile::rm(name(file)), 0);
         EXPECT_EQ(QvFile::rm(name(file)), -1);
     }
@@ -47,55 +43,32 @@ TEST_P(FileUtil, FilesWithAnyBytesInTheirNamesOpenAndGo) {
 
 TEST_P(FileUtil, AFileThatDoesNotOpenIsALineInTheLog) {
     LogCapture log;
-    EXPECT_EQ(qvfopen(name("absent"), "rb"), nullptr);
-    EXPECT_EQ(qvfopen(name(""), "rb"), nullptr);
+    EXPECT_TRUE(!qvfopen(name("absent"), "rb") && !qvfopen(name(""), "rb"));
     EXPECT_TRUE(log.contains("qvfopen: failed to open '" + temp.file("absent") + "' in mode 'rb'", 32));
-    EXPECT_EQ(QvFile::flength(name("absent")), -1);
-    EXPECT_EQ(QvFile::flength(name("")), -1);
-}
-
-TEST_P(FileUtil, LengthKeepsThePlaceInAStream) {
-    temp.write("f", "0123456789");
-    void* const stream = qvfopen(name("f"), "rb");
-    ASSERT_NE(stream, nullptr);
-    EXPECT_EQ(QvFile::fseek64(stream, 4, SEEK_SET), 0);
-    EXPECT_EQ(QvFile::flength(stream), 10);
-    EXPECT_EQ(std::fgetc(static_cast<std::FILE*>(stream)), '4');
-    std::fclose(static_cast<std::FILE*>(stream));
-    EXPECT_EQ(QvFile::flength(static_cast<void*>(nullptr)), -1);
-}
-
-TEST_P(FileUtil, APipeHasNoLengthAndNobodyWaitsForIt) {
+    EXPECT_TRUE(QvFile::flength(name("absent")) == -1 && QvFile::flength(name("")) == -1);
     ASSERT_EQ(mkfifo(temp.file("pipe").c_str(), 0600), 0);
-    EXPECT_EQ(QvFile::flength(name("pipe")), -1);
+    EXPECT_EQ(QvFile::flength(name("pipe")), -1);  // without waiting for it
     EXPECT_TRUE(QvFile::isFile(name("pipe")));
 }
 
 TEST_P(FileUtil, FoldersAreMadeWithTheirParents) {
-    EXPECT_EQ(QvFile::mkpath(name("a/b//c/")), 0);
-    EXPECT_TRUE(QvFile::isDir(name("a/b/c")));
-    EXPECT_FALSE(QvFile::isFile(name("a/b/c")));
-    EXPECT_EQ(QvFile::mkpath(name("a/b/c")), 0);
+    for (int i = 0; i < 2; ++i) EXPECT_EQ(QvFile::mkpath(name("a/b//c/")), 0);
+    EXPECT_TRUE(QvFile::isDir(name("a/b/c")) && !QvFile::isFile(name("a/b/c")));
     EXPECT_EQ(QvFile::mkpath(GetParam()("")), 0);
     temp.write("file", "");
-    EXPECT_EQ(QvFile::mkpath(name("file/x")), -1);
-    EXPECT_EQ(QvFile::mkpath(name("file")), -1);
+    EXPECT_TRUE(QvFile::mkpath(name("file/x")) == -1 && QvFile::mkpath(name("file")) == -1);
     EXPECT_EQ(QvFile::mkdir(name("d")), 0);
-    EXPECT_EQ(QvFile::mkdir(name("d")), -1);
-    EXPECT_EQ(QvFile::mkdir(name("no/d")), -1);
+    EXPECT_TRUE(QvFile::mkdir(name("d")) == -1 && QvFile::mkdir(name("no/d")) == -1);
 }
 
 TEST_P(FileUtil, MovingLosesNothing) {
     temp.write("from", "new");
     temp.write("to", "old");
     EXPECT_EQ(QvFile::mv(name("from"), name("to"), false), -1);
-    EXPECT_EQ(TempFolder::read(temp.file("to")), "old");
     EXPECT_EQ(QvFile::mv(name("absent"), name("to"), true), -1);
-    EXPECT_EQ(TempFolder::read(temp.file("to")), "old");
     EXPECT_EQ(QvFile::mv(name("to"), name("to"), true), 0);
     EXPECT_EQ(TempFolder::read(temp.file("to")), "old");
     EXPECT_EQ(QvFile::mv(name("from"), narrow(temp.file("to")), true), 0);
-    EXPECT_EQ(TempFolder::read(temp.file("to")), "new");
     fs::create_directory(temp.file("folder"));
     EXPECT_EQ(QvFile::mv(name("to"), name("folder"), true), -1);
     EXPECT_EQ(QvFile::mv(name("to"), name("folder/inside"), false), 0);
@@ -115,14 +88,12 @@ TEST_P(FileUtil, ModificationIsLocalTimeToTheMicrosecond) {
 }
 
 TEST(FileUtilPlain, WhatIsNoTextFailsQuietly) {
-    EXPECT_FALSE(QvFile::isFile(Any()));
-    EXPECT_FALSE(QvFile::isDir(5));
-    EXPECT_EQ(QvFile::flength(Any(5)), -1);
-    EXPECT_EQ(QvFile::rm(5), -1);
-    EXPECT_EQ(QvFile::mkdir(Any()), -1);
-    EXPECT_EQ(QvFile::rmdir(Any("")), -1);
-    EXPECT_EQ(QvFile::mv("a", 5, true), -1);
-    EXPECT_EQ(execute_process(Any()), -1);
+    EXPECT_FALSE(QvFile::isFile(Any()) || QvFile::isDir(5));
+    const long long results[] = {QvFile::flength(Any(5)),  QvFile::rm(5),
+                                 QvFile::mkdir(Any()),     QvFile::rmdir(Any("")),
+                                 QvFile::mv("a", 5, true), execute_process(Any()),
+                                 QvFile::freeSpace(Any()), QvFile::flength(static_cast<void*>(nullptr))};
+    for (const long long result : results) EXPECT_EQ(result, -1) << &result - results;
     EXPECT_EQ(QvFile::ls(5, 0).size(), 0);
 }
 
@@ -134,18 +105,12 @@ TEST(FileUtilPlain, CommandsTakeQuotedNamesOfBothWidths) {
     EXPECT_EQ(execute_process("exit 7"), 7);
 }
 
-TEST(FileUtilPlain, PlacesHaveTheirSeparators) {
+TEST(FileUtilPlain, PlacesAreThePlatformsAnswer) {
     EXPECT_EQ(qv_os_name(QvFile::tempDir()).back(), '/');
-    EXPECT_TRUE(QvFile::isDir(QvFile::tempDir()));
-    EXPECT_TRUE(QvFile::isAbsolutePath(core_library_path()));
-    EXPECT_TRUE(QvFile::isFile(core_library_path()));
-}
-
-TEST(FileUtilPlain, DiscSpaceIsThePlatformsAnswer) {
+    EXPECT_TRUE(QvFile::isAbsolutePath(core_library_path()) && QvFile::isFile(core_library_path()));
     FullDisc disc(77);
     const PlatformScope scope(disc);
     EXPECT_EQ(QvFile::freeSpace("/tmp/x"), 77);
-    EXPECT_EQ(QvFile::freeSpace(Any()), -1);
 }
 
 }  // namespace

@@ -1,10 +1,6 @@
 #include "core/engine/qviniparser.h"
 
-#include <gtest/gtest.h>
-
-#include <string>
-#include <vector>
-
+#include "tests/support/checks.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/temp_folder.h"
 
@@ -14,7 +10,7 @@ class Ini : public testing::Test {
   protected:
     TempFolder temp;
     QvIniParser ini;
-    std::vector<std::string> errors;
+    Texts errors;
 
     int load(std::string_view text) {
         AnyVector found("left over");
@@ -29,42 +25,32 @@ class Ini : public testing::Test {
     }
 };
 
-using Messages = std::vector<std::string>;
-
 TEST_F(Ini, LinesAreTakenApartAtTheirFirstSeparator) {
-    EXPECT_EQ(load("# comment\r\n! comment\n\n \t\n[one]\nk = v \nc: d\nb=1:2\nm:x=y\n\tlong key =  a  "
-                   "b\t\r\n[two] rest\n"
-                   "a=b"),
-              0);
-    EXPECT_EQ(errors, Messages{});
-    EXPECT_EQ(ini.nrSections(), 2);
-    EXPECT_TRUE(ini.section(1) == "two");
-    EXPECT_FALSE(ini.section(2).isValid());
-    EXPECT_EQ(value("one", "k"), "v");
-    EXPECT_EQ(value("one", "c"), "d");
-    EXPECT_EQ(value("one", "b"), "1:2");
-    EXPECT_EQ(value("one", "m:x"), "y");
-    EXPECT_EQ(value("one", "long key"), "a  b");
-    EXPECT_EQ(value("two", "a"), "b");
-    EXPECT_EQ(value("two", "k"), "(invalid)");
-    EXPECT_EQ(value("three", "a"), "(invalid)");
+    EXPECT_EQ(
+        load("# comment\r\n! comment\n\n \t\n[one]\nk = v \nc: d\nb=1:2\nm:x=y\n\tlong key =  a  b\t\r\n"
+             "[two] rest\na=b"),
+        0);
+    EXPECT_EQ(errors, Texts{});
+    EXPECT_TRUE(ini.nrSections() == 2 && ini.section(1) == "two" && !ini.section(2).isValid());
+    AnyDict items("left over", 1);
+    EXPECT_EQ(ini.getSectionItems("one", &items), 0);
+    EXPECT_EQ(items, AnyDict("k", "v", "c", "d", "b", "1:2", "m:x", "y", "long key", "a  b"));
+    EXPECT_EQ(value("two", "a") + value("two", "k") + value("three", "a"), "b(invalid)(invalid)");
 }
 
 TEST_F(Ini, EachFaultHasItsMessageAndStatus) {
     const struct {
         std::string text;
         int status;
-        Messages messages;
+        Texts messages;
     } cases[] = {
         {"a", 0, {"line 1: line too short"}},
         {"[s]\nab", 0, {"line 2: line too short"}},
         {"[s]\na=", -15, {"line 2: value too short"}},
-        {"[s]\na= \t", -15, {"line 2: value too short"}},
         {"[s]\n = b", -15, {"line 2: key too short"}},
         {"[s]\nabc", -15, {"line 2: can't parse line"}},
         {"k=v", -15, {"line 1: data outside section"}},
         {"[s", -15, {"line 1: unterminated or empty section"}},
-        {"[]", -15, {"line 1: unterminated or empty section"}},
         {"[]x=y", -15, {"line 1: unterminated or empty section"}},
         {std::string("[s]\nk=a\0b", 9), -15, {"line 2: can't parse line"}},
         {"[s]\nabc\nk=v\na", -15, {"line 2: can't parse line", "line 4: line too short"}},
@@ -80,19 +66,15 @@ TEST_F(Ini, EachFaultHasItsMessageAndStatus) {
 TEST_F(Ini, FaultsDoNotStopTheReading) {
     EXPECT_EQ(load("lost=1\n[s]\nk=v\n[\nl=w\n???\n[t]\nm=x\n"), -15);
     EXPECT_EQ(errors.size(), 3u);
-    EXPECT_EQ(value("s", "k"), "v");
-    EXPECT_EQ(value("s", "l"), "w");
-    EXPECT_EQ(value("t", "m"), "x");
+    EXPECT_EQ(value("s", "k") + value("s", "l") + value("t", "m"), "vwx");
 }
 
 TEST_F(Ini, RepeatedSectionsAndKeysAnswerWithTheFirst) {
     EXPECT_EQ(load("[s]\na=1\na=2\n[t]\nz=0\n[s]\na=3\nb=4\n"), 0);
-    EXPECT_EQ(ini.nrSections(), 3);
-    EXPECT_EQ(value("s", "a"), "1");
-    EXPECT_EQ(value("s", "b"), "4");
-    AnyDict items("left over", 1);
+    EXPECT_EQ(value("s", "a") + value("s", "b"), "14");
+    AnyDict items;
     EXPECT_EQ(ini.getSectionItems("s", &items), 0);
-    EXPECT_TRUE(items == AnyDict("a", "1", "b", "4"));
+    EXPECT_EQ(items, AnyDict("a", "1", "b", "4"));
     EXPECT_EQ(ini.getSectionItems("none", &items), -1);
     EXPECT_EQ(items.size(), 0);
 }
@@ -102,32 +84,24 @@ TEST_F(Ini, NumbersAreWholeOrTheDefaultWithAMessage) {
     load(
         "[n]\ni=-42\np=+7\nbig=3000000000\nhuge=99999999999999999999\nf=2.5e3\ntext=abc\ntail=12abc\nsign=+-"
         "1\n");
-    EXPECT_EQ(ini.getInt32Value("n", "i", 1), -42);
-    EXPECT_EQ(ini.getInt32Value("n", "p", 1), 7);
-    EXPECT_EQ(ini.getInt64Value("n", "big", 1), 3000000000LL);
-    EXPECT_EQ(ini.getFloatValue("n", "f", 1), 2500);
+    EXPECT_TRUE(ini.getInt32Value("n", "i", 1) == -42 && ini.getInt32Value("n", "p", 1) == 7);
+    EXPECT_TRUE(ini.getInt64Value("n", "big", 1) == 3000000000LL && ini.getFloatValue("n", "f", 1) == 2500);
     EXPECT_EQ(ini.getInt32Value("n", "absent", 1), 1);
     EXPECT_EQ(ini.errors().size(), 0);
-    EXPECT_EQ(ini.getInt32Value("n", "big", 1), 1);
-    EXPECT_EQ(ini.getInt32Value("n", "tail", 2), 2);
-    EXPECT_EQ(ini.getInt32Value("n", "sign", 2), 2);
-    EXPECT_EQ(ini.getInt64Value("n", "huge", 3), 3);
-    EXPECT_EQ(ini.getFloatValue("n", "text", 4), 4);
+    for (const char* bad : {"big", "tail", "sign"}) EXPECT_EQ(ini.getInt32Value("n", bad, 1), 1) << bad;
+    EXPECT_TRUE(ini.getInt64Value("n", "huge", 3) == 3 && ini.getFloatValue("n", "text", 4) == 4);
     EXPECT_EQ(ini.errors().size(), 5);
-    for (const char* line :
-         {"Couldn't read int value", "Couldn't read int64_t value", "Couldn't read double value"})
-        EXPECT_TRUE(log.contains(line)) << line;
+    for (const char* type : {"int", "int64_t", "double"})
+        EXPECT_TRUE(log.contains("Couldn't read " + std::string(type) + " value")) << type;
 }
 
 TEST_F(Ini, LongLinesKeepTheirStartAndSaySo) {
-    EXPECT_EQ(load("[s]\nk=" + std::string(1022, 'v') + "\r\n"), 0);
-    EXPECT_EQ(value("s", "k").size(), 1022u);
+    EXPECT_EQ(load("[s]\n" + std::string(60, 'k') + "=" + std::string(963, 'v') + "\r\n"), 0);
+    EXPECT_EQ(value("s", std::string(60, 'k').c_str()).size(), 963u);
     EXPECT_EQ(load("[s]\nk=" + std::string(5000, 'v') + "=x\nl=1\n"), -15);
-    EXPECT_EQ(errors, Messages{"line 2: line too long, cut to 1024 characters"});
-    EXPECT_EQ(value("s", "k").size(), 1022u);
+    EXPECT_EQ(errors, Texts{"line 2: line too long, cut to 1024 characters"});
+    EXPECT_EQ(value("s", "k"), std::string(1022, 'v'));
     EXPECT_EQ(value("s", "l"), "1");
-    EXPECT_EQ(load("[s]\n" + std::string(60, 'k') + "=1\n"), 0);
-    EXPECT_EQ(value("s", std::string(60, 'k').c_str()), "1");
 }
 
 TEST_F(Ini, WhatCannotBeReadLeavesNothingBehind) {
@@ -135,13 +109,11 @@ TEST_F(Ini, WhatCannotBeReadLeavesNothingBehind) {
     AnyVector found;
     for (const Any& name : {Any(temp.file("absent").c_str()), Any(temp.path().c_str()), Any(5), Any("")}) {
         EXPECT_EQ(ini.load(name, &found), -9);
-        ASSERT_EQ(found.size(), 1);
-        EXPECT_TRUE(found.at(0) == "Failed to open file");
+        EXPECT_EQ(found, AnyVector(Any("Failed to open file")));
         EXPECT_EQ(ini.nrSections(), 0);
     }
     EXPECT_EQ(ini.load("/proc/self/mem", nullptr), -9);  // opens, and fails at the first byte
-    ASSERT_EQ(ini.errors().size(), 1);
-    EXPECT_TRUE(ini.errors().at(0) == "line 1: read failed");
+    EXPECT_EQ(ini.errors(), AnyVector(Any("line 1: read failed")));
 }
 
 }  // namespace

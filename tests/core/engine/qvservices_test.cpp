@@ -18,8 +18,7 @@ F* serviceEx(const char* name) {
 }
 
 TEST(Services, OnlyKnownNames) {
-    for (const char* name :
-         {"nonsense", "", "err_printf_ex", "prg_printf_ex", static_cast<const char*>(nullptr)})
+    for (const char* name : {"nonsense", "", "err_printf_ex", static_cast<const char*>(nullptr)})
         EXPECT_EQ(QvCodec::get_rc(name), nullptr);
     for (const char* name : {"malloc", "free", "yield", "nonsense", static_cast<const char*>(nullptr)})
         EXPECT_EQ(QvCodec::get_rc_ex(nullptr, name), nullptr);
@@ -29,12 +28,11 @@ TEST(Services, MemoryAndConstants) {
     auto* allocate = service<void*(unsigned)>("malloc");
     auto* release = service<void(void*)>("free");
     ASSERT_TRUE(allocate && release);
-    void* block = allocate(100000);
-    std::memset(block, 1, 100000);
-    release(block);
-    void* empty = allocate(0);
-    EXPECT_NE(empty, nullptr);
-    release(empty);
+    for (const unsigned size : {0u, 100000u}) {
+        void* const block = allocate(size);
+        ASSERT_NE(block, nullptr);
+        release(std::memset(block, 1, size));
+    }
     release(nullptr);
     EXPECT_EQ(service<int()>("yield")(), 0);
     EXPECT_EQ(service<int()>("prompt_index_mode")(), 1);

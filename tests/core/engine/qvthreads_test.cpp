@@ -40,14 +40,14 @@ TEST(Threads, AnEventHandsOverBothWays) {
     QvEvent ping, pong;
     int value = 0;
     QvThread other;
-    ASSERT_EQ(other.start([&] {
+    const auto answer = [&] {
         for (int i = 0; i < 1000; ++i) {
             ping.wait(-1);
             ++value;
             pong.post();
         }
-    }),
-              0);
+    };
+    ASSERT_EQ(other.start(answer), 0);
     for (int i = 0; i < 1000; ++i) {
         EXPECT_EQ(value, i);
         ping.post();

@@ -2,7 +2,6 @@
 
 #include <gtest/gtest.h>
 
-#include <clocale>
 #include <cmath>
 #include <limits>
 #include <string>
@@ -34,7 +33,6 @@ TEST(Timer, FormatsSplitTheTimeIntoTheirFields) {
         {3661.5, "3661.500", "61:01.500", "1:01:01.500"},
         {0.57, "0.570", "0:00.570", "0:00:00.570"},  // 0.57 * 1000 lies below 570
         {59.9996, "60.000", "1:00.000", "0:01:00.000"},
-        {360'000, "360000.000", "6000:00.000", "100:00:00.000"},
         {-1.5, "-1.500", "-0:01.500", "-0:00:01.500"},
         {1e300, "100000000000.000", "1666666666:40.000", "27777777:46:40.000"},
         {-std::numeric_limits<double>::infinity(), "-100000000000.000", "-1666666666:40.000",
@@ -53,19 +51,14 @@ TEST(Timer, MeasuresFromItsStartWithoutStopping) {
     Clock clock;
     const PlatformScope scope(clock);
     QvTimer timer;
-    clock.now += 1'250'000'000;
-    EXPECT_DOUBLE_EQ(timer.stop(), 1.25);
-    clock.now += 250'000'000;
-    EXPECT_DOUBLE_EQ(timer.stop(), 1.5);
+    for (const double seconds : {1.25, 2.5}) {
+        clock.now += 1'250'000'000;
+        EXPECT_DOUBLE_EQ(timer.stop(), seconds);
+    }
     timer.start();
     EXPECT_DOUBLE_EQ(timer.stop(), 0);
-    EXPECT_DOUBLE_EQ(QvTimer::absoluteTime(), 6.5);
-}
-
-TEST(Timer, TimeOfTheProcessCountsWholeMilliseconds) {
-    Clock clock;
-    const PlatformScope scope(clock);
-    const double first = QvTimer::time();
+    EXPECT_DOUBLE_EQ(QvTimer::absoluteTime(), 7.5);
+    const double first = QvTimer::time();  // whole milliseconds
     clock.now += 999'999;
     EXPECT_EQ(QvTimer::time(), first);
     clock.now += 1;

@@ -6,7 +6,7 @@
 #include <string>
 
 #include "core/media/qvgeometry.h"
-#include "tests/core/value/value_support.h"
+#include "tests/support/checks.h"
 
 namespace {
 

@@ -8,7 +8,7 @@
 
 #include "core/engine/status.h"
 #include "core/value/anycontainer.h"
-#include "tests/core/value/value_support.h"
+#include "tests/support/checks.h"
 #include "tests/support/log_capture.h"
 
 namespace {
