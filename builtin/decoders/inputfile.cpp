@@ -9,7 +9,9 @@ int InputFile::open(const Any& name, std::size_t bufferBytes) {
     if (!name.isText() || name.size() == 0) return QvStatus::failed;
     file_.reset(static_cast<std::FILE*>(qvfopen(name, "rb")));
     if (!file_) return QvStatus::failed;
-    std::setvbuf(file_.get(), nullptr, _IOFBF, bufferBytes);
+    // Only a buffer that is given has the size asked for.
+    buffer_ = std::make_unique_for_overwrite<char[]>(bufferBytes);
+    std::setvbuf(file_.get(), buffer_.get(), _IOFBF, bufferBytes);
     length_ = QvFile::flength(file_.get());
     if (length_ >= 0) return QvStatus::ok;
     close();

@@ -27,6 +27,7 @@ class InputFile {
     struct Close {
         void operator()(std::FILE* file) const { std::fclose(file); }
     };
+    std::unique_ptr<char[]> buffer_;  // outlives the file that reads through it
     std::unique_ptr<std::FILE, Close> file_;
     long long length_ = 0;
 };

@@ -16,24 +16,29 @@
 
 namespace {
 
-constexpr size_t smallItem = 4096;
-constexpr size_t gatheredBytes = 1 << 16;
+// Blocks of this size end at its multiples in the file: a page that is written in two pieces costs twice.
+constexpr size_t gatheredBytes = size_t{1} << 16;
 
-// A file of samples. Items of some size go to the system without a copy, small ones are gathered first.
+// A file of samples, gathered into large blocks: those of a turn are a few kilobytes.
 class SampleFile {
   public:
     bool open(const QvWideString& name) {
         name_ = name;
         if (!file_.open(name, "wb")) return false;
         file_.setUnbuffered();
+        gathered_.reserve(gatheredBytes);
         return true;
     }
     bool write(const unsigned char* data, size_t bytes) {
-        if (bytes >= smallItem || gathered_.size() + bytes > gatheredBytes) {
-            if (!flush()) return false;
-            if (bytes >= smallItem) return file_.write(data, bytes);
+        while (bytes) {
+            const size_t piece =
+                std::min(bytes, gatheredBytes - static_cast<size_t>(position_ % gatheredBytes));
+            gathered_.insert(gathered_.end(), data, data + piece);
+            position_ += piece;
+            data += piece;
+            bytes -= piece;
+            if (position_ % gatheredBytes == 0 && !flush()) return false;
         }
-        gathered_.insert(gathered_.end(), data, data + bytes);
         return file_.isOpen();
     }
     bool flush() {
@@ -53,6 +58,7 @@ class SampleFile {
     StdFile file_;
     QvWideString name_;
     std::vector<unsigned char> gathered_;
+    unsigned long long position_ = 0;  // bytes that were written and gathered
 };
 
 }  // namespace
