@@ -14,8 +14,6 @@
 
 namespace {
 
-constexpr int kSubpicture = 4;
-
 std::string timecodeText(const MediaTime& time, const QvFramerate& rate) {
     char text[QvTimecode::textSize];
     time.timecode(rate).pprint(text, false);
@@ -50,12 +48,13 @@ void printLine(std::span<const QvCcBytePair> pairs, const QvFramerate& rate, boo
     print("%s\n", line.dump().c_str());
 }
 
-// The pairs of one frame, a line for each field.
-void printFrame(const QvCcData& data, const QvFramerate& rate, bool json) {
+// A line for each field and time.
+void printLines(const QvCcData& data, const QvFramerate& rate, bool json) {
     const auto pairs = data.pairs();
     for (auto begin = pairs.begin(); begin != pairs.end();) {
-        const auto end =
-            std::find_if(begin, pairs.end(), [&](const auto& p) { return p.type() != begin->type(); });
+        const auto end = std::find_if(begin, pairs.end(), [&](const auto& p) {
+            return p.type() != begin->type() || !(p.time == begin->time);
+        });
         printLine({begin, end}, rate, json);
         begin = end;
     }
@@ -76,28 +75,20 @@ std::unique_ptr<QvDecodePipe> openFiles(const std::vector<std::string>& files) {
                                    ": it is no SCC file, or no line of it has captions");
 }
 
-// As that the rate is a guess.
-void printWarnings() {
-    AnyVector messages;
-    qv_log()->getAll(messages);
-    for (const Any& message : messages)
-        if (message.asDict().getInt32("type") == QvLogMask::warning)
-            std::fprintf(stderr, "tarsel: warning: %s\n", message.asDict().getString("text", ""));
-}
-
 void showCaptions(const std::vector<std::string>& files, bool json) {
-    const auto decoder = openFiles(files);
+    QvFramerate rate = openFiles(files)->QvCodec::getParam("framerate").asFramerate();
     printWarnings();
-    const QvFramerate rate = decoder->QvCodec::getParam("framerate").asFramerate();
-    decoder->select(kSubpicture, 0);
-    const int frames = decoder->nrFrames(0);
-    for (int frame = 0; frame < frames; ++frame) {
-        AnyDict stored;
-        QvCcData data;
-        if (decoder->readFrame(0) != QvStatus::ok || decoder->readMeta(0, 0, stored) != QvStatus::ok)
-            continue;
-        if (data.restore(stored) == QvStatus::ok) printFrame(data, rate, json);
+    const bool dropFrame = rate.df();
+    QvCcData all;
+    for (size_t field = 0; field < files.size(); ++field) {
+        QvCcData one;
+        if (one.readScc(Any(files[field].c_str()), static_cast<int>(field), false, rate, &dropFrame, true) !=
+            0)
+            throw Failure(Exit::input, "can't read " + inQuotes(files[field]) + " again");
+        all.extend(one);
     }
+    all.sort();
+    printLines(all, rate, json);
 }
 
 }  // namespace

@@ -22,6 +22,18 @@ std::string validUtf8(const std::string& bytes) {
     return Json::parse(Json(bytes).dump(-1, ' ', false, Json::error_handler_t::replace)).get<std::string>();
 }
 
+// Of captions and subtitles. A rate says nothing about subtitles with clock times.
+void describeText(const AnyDict& p, Json& stream) {
+    if (p.get("textEncoding").isText()) stream["encoding"] = text(p.get("textEncoding"));
+    if (p.get("count").isInt()) stream["subtitles"] = p.get("count").toInt64();
+    if (p.get("framerate").isFramerate() && p.getInt32("format", QvSubtitles::SUB) == QvSubtitles::SUB)
+        stream["timecode"] = text(p.get("framerate").asFramerate().desc(true, false));
+    const Any& end = p.isSet("end") ? p.get("end") : p.get("last");
+    if (!p.get("first").isMediaTime() || !end.isMediaTime()) return;
+    stream["first_s"] = p.get("first").asMediaTime().seconds();
+    stream["last_s"] = end.asMediaTime().seconds();
+}
+
 Json describeStream(const QvDecodePipe& decoder, int type, int number) {
     AnyDict p;
     decoder.getStreamParams(type, number, p);
@@ -47,8 +59,7 @@ Json describeStream(const QvDecodePipe& decoder, int type, int number) {
         integer("frames", "frames");
         integer("nrViews", "views");
     } else if (type == 4) {
-        if (p.get("framerate").isFramerate())
-            stream["timecode"] = text(p.get("framerate").asFramerate().desc(true, false));
+        describeText(p, stream);
         integer("frames", "frames");
         integer("pairs", "pairs");
     } else {
@@ -88,9 +99,15 @@ std::string streamLine(const Json& s) {
         if (s.contains("frames")) add(number("frames") + " frames");
         if (s.contains("views") && s["views"] != 1) add(number("views") + " views");
     } else if (s["type"] == "subpicture") {
+        if (s.contains("encoding")) add(s["encoding"].get<std::string>());
         if (s.contains("timecode")) add(s["timecode"].get<std::string>());
+        if (s.contains("subtitles"))
+            add(number("subtitles") + (s["subtitles"] == 1 ? " subtitle" : " subtitles"));
         if (s.contains("frames")) add(number("frames") + " frames");
         if (s.contains("pairs")) add(number("pairs") + " pairs");
+        if (s.contains("first_s"))
+            add(formatTime(s["first_s"].get<double>()) + " to " + formatTime(s["last_s"].get<double>()));
+        return line;
     } else {
         if (s.contains("samplerate")) add(number("samplerate") + " Hz");
         if (s.contains("channels")) add(number("channels") + " ch");
@@ -131,6 +148,9 @@ void info(const Given& given) {
             if (!given.json) printFile(all.back());
             if (all.back().contains("damage"))
                 failures.push_back(inQuotes(name) + " is damaged: " + source.damage());
+            else
+                printWarnings();
+            qv_log()->clear();
         } catch (const Failure& failure) {
             if (failure.exit() != Exit::input) throw;
             failures.push_back(failure.what());

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <cstdio>
 #include <cstring>
 #include <filesystem>
 
@@ -12,6 +13,7 @@
 namespace {
 
 constexpr int kDecoder = 2;
+constexpr int kSubpicture = 4;
 constexpr const char* kGenerator = "testgen:";
 
 // Every name that a raw format takes.
@@ -29,9 +31,18 @@ double parseAspect(const std::string& text, const std::string& option) {
 
 }  // namespace
 
+void printWarnings() {
+    AnyVector messages;
+    qv_log()->getAll(messages);
+    for (const Any& message : messages)
+        if (message.asDict().getInt32("type") == QvLogMask::warning)
+            std::fprintf(stderr, "tarsel: warning: %s\n", message.asDict().getString("text", ""));
+}
+
 std::vector<std::string> moduleNames(int kind) {
     std::vector<std::string> names;
     const AnyVector modules = qv_registry()->modules(kind);
+    names.reserve(static_cast<size_t>(modules.size()));
     for (int i = 0; i < modules.size(); ++i) names.push_back(modules.at(i).asDict().getString("name", ""));
     return names;
 }
@@ -248,6 +259,9 @@ double Source::duration() const {
             const Any seconds = decoder_->getStreamParam(type, i, "duration");
             if (seconds.isDouble()) longest = std::max(longest, seconds.asDouble());
         }
+    if (decoder_->nrStreams(1) + decoder_->nrStreams(2) > 0) return longest;
+    for (int i = 0; i < decoder_->nrStreams(kSubpicture); ++i)
+        longest = std::max(longest, decoder_->duration(kSubpicture, i).seconds());
     return longest;
 }
 
@@ -260,6 +274,9 @@ void Source::selectAll() {
 }
 
 std::string Source::damage() const {
+    for (int i = 0; i < decoder_->nrStreams(kSubpicture); ++i)
+        if (const long long bytes = decoder_->getStreamParam(kSubpicture, i, "unread").asInt64(0); bytes > 0)
+            return "the last " + std::to_string(bytes) + " bytes of its text can't be read";
     for (int type : {1, 2})
         for (int i = 0; i < decoder_->nrStreams(type); ++i) {
             AnyDict params;

@@ -22,7 +22,7 @@ class Source {
 
     // Of the first video stream.
     std::optional<QvFramerate> frameRate() const;
-    // Seconds of the longest stream; negative when unknown.
+    // Seconds of the longest stream, of subpictures only where there is nothing else; negative when unknown.
     double duration() const;
     // Why the file holds less than its header says, or more than whole frames; empty when it is whole.
     std::string damage() const;
@@ -45,6 +45,9 @@ class Source {
 // Sets a parameter that the decoder, encoder or filter must know; throws Failure (usage) for an unknown name
 // or a value it can't take.
 void setChecked(QvCodec& codec, const std::string& name, const Any& value, const std::string& what);
+
+// What the decoders warned of so far, as that a rate is a guess, on the standard error.
+void printWarnings();
 
 // The names of all modules of a kind.
 std::vector<std::string> moduleNames(int kind);

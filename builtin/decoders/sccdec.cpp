@@ -108,6 +108,11 @@ void CCStream::read(long long n, const QvFramerate& rate, QvCcData& result) cons
     result.shiftTimes(MediaTime() - timeOffset);
 }
 
+MediaTime CCStream::begin() const {
+    const auto first = [this](std::size_t field) { return data[field].minTime(true) - timeOffset; };
+    return !hasData[1] ? first(0) : !hasData[0] ? first(1) : std::min(first(0), first(1));
+}
+
 MediaTime CCStream::end() const {
     MediaTime last;
     for (std::size_t field = 0; field < fields; ++field)
@@ -285,6 +290,8 @@ void SccDec::describe(CCStream& stream) const {
     stream.params.set("frames", frames);
     stream.params.set("duration", MediaTime(frames, stream.framerate, MediaTime::defaultTimescale).seconds());
     stream.params.set("pairs", stream.data[0].count() + stream.data[1].count());
+    stream.params.set("first", stream.begin());
+    stream.params.set("last", stream.end());
 }
 
 int SccDec::framesUntilEnd(const QvFramerate& rate) const {

@@ -17,7 +17,8 @@
 // these). Read only: "inOut" (a Dict with first and last time, "inField1", "outField1", "inField2",
 // "outField2", of the fields that have data), "filesize".
 //
-// Stream parameters: "codec", "framerate", "frames" (to the last pair), "duration" (Float, seconds), "pairs".
+// Stream parameters: "codec", "framerate", "frames" (to the last pair), "duration" (Float, seconds), "pairs",
+// "first" and "last" (MediaTime of the stream).
 #pragma once
 
 #include <array>
@@ -38,7 +39,8 @@ class CCStream : public DPipeStream {
 
     // The pairs of field 1, then of field 2, within frame n at a rate, in time of the stream.
     void read(long long n, const QvFramerate& rate, QvCcData& result) const;
-    MediaTime end() const;  // of the last pair, in time of the stream
+    MediaTime begin() const;  // of the first pair, in time of the stream
+    MediaTime end() const;    // of the last one; 0 if that is before the start of the stream
 };
 
 class SccDec : public BaseDecodePipe {

@@ -105,14 +105,20 @@ AnyDict SubImporter::description() const {
     format.set("format", static_cast<int>(subtitles_->format()));
     format.set("count", count);
     format.set("encoding", 0);
-    format.set("framerate", subtitles_->rate());
-    if (subtitles_->unread() > 0) format.set("truncated", 1);
+    format.set("codec", subtitles_->formatName());
+    format.set("textEncoding", subtitles_->encodingName());
+    if (subtitles_->unread() > 0) {
+        format.set("truncated", 1);
+        format.set("unread", subtitles_->unread());
+    }
     if (count == 0) return format;
     const MediaTime& first = subtitles_->at(0)->start;
     const MediaTime& last = subtitles_->at(count - 1)->start;
     format.set("first", first);
     format.set("last", last);
     format.set("duration", last - first);
+    format.set("framerate", subtitles_->rate());
+    format.set("end", end_);
     return format;
 }
 

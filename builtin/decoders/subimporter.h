@@ -10,8 +10,9 @@
 // by a video link to the video's; invalid: "framerate"). Read only: "filesize".
 //
 // Stream parameters: "type" (1), "format" (QvSubtitles::Format), "count" (entries), "encoding" (0),
-// "framerate", and with entries "first", "last" (their start times) and "duration" (between these,
-// MediaTime).
+// "codec" ("SubRip", "SubViewer" or "MicroDVD"), "textEncoding" (QvSubtitles::encodingName); with entries
+// "first", "last" (their start times), "duration" (between these), "end" (of all; each a MediaTime) and
+// "framerate"; where text could not be read "truncated" (1) and "unread" (its bytes).
 #pragma once
 
 #include <optional>

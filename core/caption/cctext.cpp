@@ -17,7 +17,7 @@ constexpr Characters16 specialCharacters = {"®", "°", "½", "¿", "™", "¢",
 constexpr Characters32 westCharacters = {"Á", "É", "Ó", "Ú", "Ü", "ü", "‘", "¡", "*", "'", "—",
                                          "©", "℠", "•", "“", "”", "À", "Â", "Ç", "È", "Ê", "Ë",
                                          "ë", "Î", "Ï", "ï", "Ô", "Ù", "ù", "Û", "«", "»"};
-// 0x13 or 0x1B, then 0x20 to 0x3F: Portuguese, German, Danish.
+// 0x13 or 0x1B, then 0x20 to 0x3F: Portuguese, German, Danish. The pipe of 0x2E is broken, as "|" parts rows.
 constexpr Characters32 northCharacters = {"Ã",  "ã", "Í", "Ì", "ì", "Ò", "ò", "Õ", "õ", "{", "}",
                                           "\\", "^", "_", "¦", "~", "Ä", "ä", "Ö", "ö", "ß", "¥",
                                           "¤",  "│", "Å", "å", "Ø", "ø", "┌", "┐", "└", "┘"};

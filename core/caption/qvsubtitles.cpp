@@ -10,6 +10,7 @@
 #include "core/engine/qvlog.h"
 #include "core/engine/status.h"
 #include "core/value/qvassert.h"
+#include "core/value/utf.h"
 
 namespace {
 
@@ -30,6 +31,11 @@ int formatOf(const Any& filename) {
 // Zeros inside are no text in an encoding of single bytes; padding at the end is.
 bool isText(std::string_view text) {
     return text.find_first_not_of('\0', std::min(text.find('\0'), text.size())) == text.npos;
+}
+
+const char* encodingOfBytes(std::string_view text) {
+    const bool ascii = std::all_of(text.begin(), text.end(), [](char c) { return (c & 0x80) == 0; });
+    return ascii ? "ASCII" : QvUtf::isValid(text) ? "UTF-8" : "8-bit";
 }
 
 std::string textOf(const QvSubtitle& entry) {
@@ -83,6 +89,8 @@ int QvSubtitles::parseFile(const Any& filename, const QvFramerate& rate) {
     entries_.clear();
     lastFound_ = 0;
     encoding_ = markNone;
+    unmarked_ = "";
+    subViewer_ = false;
     unread_ = 0;
     const int format = formatOf(filename);
     if (format == 0) return QvStatus::failed;
@@ -92,6 +100,7 @@ int QvSubtitles::parseFile(const Any& filename, const QvFramerate& rate) {
     if (file.read(filename) != QvStatus::ok) return QvStatus::failed;
     const SubtitleMark mark = findMark(file.view());
     encoding_ = static_cast<Encoding>(mark.encoding);
+    if (encoding_ == markNone) unmarked_ = encodingOfBytes(file.view());
     const std::size_t bound = subtitleBound(file.view(), mark);
     int status = parse(subtitleText(file.view(), mark, false), bound);
     // The mark of the other byte order is honoured where this machine's order says nothing.
@@ -112,6 +121,7 @@ int QvSubtitles::parse(std::string_view text, std::size_t bound) {
         entry->rows = 1 + static_cast<int>(std::count(parsed.text.begin(), parsed.text.end(), '|'));
         entry->start = parsed.start;
         entry->end = parsed.end;
+        subViewer_ |= parsed.subViewer;
         entries_.push_back(std::move(entry));
     };
     const std::size_t beyond = text.size() - std::min(text.size(), bound);
@@ -124,6 +134,15 @@ int QvSubtitles::parse(std::string_view text, std::size_t bound) {
     }
     unread_ += static_cast<long long>(parseSrt(text, take));
     return QvStatus::ok;
+}
+
+const char* QvSubtitles::formatName() const {
+    return format_ == SUB ? "MicroDVD" : subViewer_ ? "SubViewer" : "SubRip";
+}
+
+const char* QvSubtitles::encodingName() const {
+    static constexpr const char* marked[] = {"", "UTF-8", "UTF-16BE", "UTF-16LE", "UTF-32BE", "UTF-32LE"};
+    return encoding_ == markNone ? unmarked_ : marked[encoding_];
 }
 
 int QvSubtitles::saveToFile(const Any& filename, Format format) const {

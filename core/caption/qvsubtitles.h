@@ -59,6 +59,10 @@ class QV_API QvSubtitles {
     Format format() const { return format_; }
     const QvFramerate& rate() const { return rate_; }
     Encoding encoding() const { return encoding_; }
+    // For people: "SubRip", "SubViewer" or "MicroDVD"; and "UTF-16LE" and so on for a file with a mark, else
+    // "ASCII", "UTF-8" where the bytes are that, or "8-bit" for those of a code page that no file tells.
+    const char* formatName() const;
+    const char* encodingName() const;
     int maxRows() const { return maxRows_; }  // of all entries; 0 without any
 
     // Bytes of text, as UTF-8, behind the place where parseFile stopped: in an SRT file at a number that no
@@ -69,6 +73,8 @@ class QV_API QvSubtitles {
     std::vector<std::unique_ptr<QvSubtitle>> entries_;
     Format format_ = SRT;
     Encoding encoding_ = markNone;
+    const char* unmarked_ = "";  // encodingName of a file without a mark
+    bool subViewer_ = false;
     int maxRows_ = 0;
     int lastFound_ = 0;
     long long unread_ = 0;

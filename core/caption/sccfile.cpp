@@ -21,7 +21,8 @@ constexpr std::size_t blockSize = 64 * 1024;
 constexpr std::size_t wordDigits = 4;
 constexpr std::size_t shortestTimecode = 7, longestTimecode = 11;
 constexpr int timecodeParts = 4;
-constexpr long largestFrameField = 60, largestPart = 99;
+constexpr long largestFrameField = 60;
+constexpr long largestHour = 9900;  // the frames of more go beyond an int
 
 class LineReader {
   public:
@@ -83,23 +84,23 @@ bool readTimecode(std::string_view token, bool dropFrameLines, QvTimecode& timec
     const char* at = text;
     for (int& part : parts) {
         const long value = std::strtol(at, nullptr, 10);
-        if (value < 0 || value > largestPart) return false;
+        if (value < 0) return false;
         part = static_cast<int>(value);
         const char* colon = std::strchr(at, ':');
         at = colon ? colon + 1 : "";
     }
-    if (parts.back() > largestFrameField) return false;
+    if (parts.front() > largestHour || parts.back() > largestFrameField) return false;
     timecode = QvTimecode(parts[0], parts[1], parts[2], parts[3], semicolon);
     return true;
 }
 
 // Of each byte, -1 for what is no digit.
 constexpr auto hexDigits = [] {
-    std::array<signed char, 256> digits{};
+    std::array<short, 256> digits{};
     digits.fill(-1);
     for (int i = 0; i < 16; ++i)
         digits[static_cast<unsigned char>("0123456789abcdef"[i])] =
-            digits[static_cast<unsigned char>("0123456789ABCDEF"[i])] = static_cast<signed char>(i);
+            digits[static_cast<unsigned char>("0123456789ABCDEF"[i])] = static_cast<short>(i);
     return digits;
 }();
 

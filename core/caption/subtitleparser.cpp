@@ -75,7 +75,7 @@ int readSubLine(Lines& lines, const QvFramerate& rate, const SubtitleTaker& take
         frame = braces.value;
     }
     const auto time = [&rate](int frame) { return MediaTime(frame, rate, MediaTime::defaultTimescale); };
-    take({time(frames[0]), time(frames[1]), std::string(lines.next())});
+    take({time(frames[0]), time(frames[1]), std::string(lines.next()), false});
     return QvStatus::ok;
 }
 
@@ -152,7 +152,7 @@ std::size_t parseSrt(std::string_view text, const SubtitleTaker& take) {
         }
         const auto times = readTimes(line);
         if (!times) continue;
-        ParsedSubtitle entry{times->start, times->end, readLines(lines)};
+        ParsedSubtitle entry{times->start, times->end, readLines(lines), times->subViewer};
         if (times->subViewer) breakSubViewerLines(entry.text);
         take(std::move(entry));
     }

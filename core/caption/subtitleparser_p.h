@@ -11,7 +11,8 @@
 struct ParsedSubtitle {
     MediaTime start;
     MediaTime end;
-    std::string text;  // lines separated by "|"
+    std::string text;        // lines separated by "|"
+    bool subViewer = false;  // its times were separated by a comma
 };
 
 using SubtitleTaker = std::function<void(ParsedSubtitle&&)>;

@@ -51,6 +51,14 @@ void addMoved(QvFrame& to, const QvFrame& from, int dx, int dy) {
         takeGreater(rowOf(to, y) + std::max(0, dx), rowOf(from, y - dy) + std::max(0, -dx), count);
 }
 
+// Letters joined with themselves moved to the four corners, bit by bit; the border stays.
+void joinCorners(const QvFrame& letters, QvFrame& mask, int radius) {
+    for (int y = radius; y < mask.height() - radius; ++y)
+        for (const Byte* from : {rowOf(letters, y - radius), rowOf(letters, y + radius)})
+            for (int x = radius; x < mask.width() - radius; ++x)
+                rowOf(mask, y)[x] |= static_cast<Byte>(from[x - radius] | from[x + radius]);
+}
+
 // A row with the weights 1 2 1; outside there is nothing.
 void sumRow(const Byte* row, int width, unsigned short* sums) {
     const auto sum = [](int a, int b, int c) { return static_cast<unsigned short>(a + 2 * b + c); };
@@ -115,11 +123,7 @@ void drawLetters(const TextLine& line, int baseline, const AnyVector& fieldMasks
 
 void outlineMask(const QvFrame& letters, QvFrame& mask, int radius) {
     mask = letters;
-    if (radius > 1) {
-        for (const int dx : {radius, -radius})
-            for (const int dy : {radius, -radius}) addMoved(mask, letters, dx, dy);
-        return;
-    }
+    if (radius > 1) return joinCorners(letters, mask, radius);
     for (const int dx : {1, -1}) addMoved(mask, letters, dx, 0);
     const QvFrame wide(mask);
     for (const int dy : {1, -1}) addMoved(mask, wide, 0, dy);

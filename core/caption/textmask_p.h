@@ -17,7 +17,7 @@ void drawLetters(const TextLine& line, int baseline, const AnyVector& fieldMasks
                  QvFrame& mask);
 
 // What letters cover together with their outline: each pixel takes the greatest coverage within `radius`;
-// with a radius above 1 only that of the four corners and its own.
+// with a radius above 1 it takes the bits of its own and of the four corners', but not at the border.
 void outlineMask(const QvFrame& letters, QvFrame& mask, int radius);
 
 // Adds a shadow one pixel to the right and below, its edge blurred if it is `soft`.

@@ -64,22 +64,35 @@ TEST(QvCcBytePair, HeaderAndStoredForm) {
 TEST(QvCcData, FindsByTypeTimeAndPlace) {
     QvCcData data = listOf({0, 1, 2, 3, 0, 1, 0});
     data.at(4).setValid(false);
+    data.at(1).time = MediaTime(50);
+    EXPECT_FALSE(data.isSorted());
     const int mask0 = 1, mask708 = 12, two = 2, none = 0, far = 99, back = -1, four = 4;
     const MediaTime t2(2), t4(4);
     const bool valid = true;
-    using List = AnyVector;
-    EXPECT_EQ(data.find(nullptr, nullptr, nullptr, nullptr, nullptr, nullptr, true, nullptr).size(), 7);
-    EXPECT_EQ(data.find(&mask0, nullptr, nullptr, nullptr, nullptr, nullptr, true, nullptr), List(0, 4, 6));
-    EXPECT_EQ(data.find(&mask0, nullptr, nullptr, nullptr, nullptr, &valid, true, nullptr), List(0, 6));
-    EXPECT_EQ(data.find(&mask708, nullptr, nullptr, nullptr, nullptr, nullptr, true, nullptr), List(2, 3));
-    EXPECT_EQ(data.find(nullptr, nullptr, nullptr, &t2, &t4, nullptr, true, nullptr), List(2, 3, 4));
-    EXPECT_EQ(data.find(nullptr, &far, &back, nullptr, nullptr, nullptr, true, nullptr), List(Any(6)));
-    EXPECT_EQ(data.find(nullptr, &two, &four, nullptr, nullptr, nullptr, true, &two), List(2, 3));
-    EXPECT_TRUE(data.find(nullptr, nullptr, nullptr, nullptr, nullptr, nullptr, true, &none).empty());
-    data.at(1).time = MediaTime(50);
-    EXPECT_FALSE(data.isSorted());
-    EXPECT_EQ(data.find(nullptr, nullptr, nullptr, nullptr, &t4, nullptr, true, nullptr), List(Any(0)));
-    EXPECT_EQ(data.find(nullptr, nullptr, nullptr, nullptr, &t4, nullptr, false, nullptr), List(0, 2, 3, 4));
+    const struct {
+        const int *mask, *start, *end;
+        const MediaTime *from, *to;
+        const bool* valid;
+        bool stop;
+        const int* most;
+        AnyVector expected;
+    } rows[] = {
+        {nullptr, nullptr, nullptr, nullptr, nullptr, nullptr, true, nullptr, {0, 1, 2, 3, 4, 5, 6}},
+        {&mask0, nullptr, nullptr, nullptr, nullptr, nullptr, true, nullptr, {0, 4, 6}},
+        {&mask0, nullptr, nullptr, nullptr, nullptr, &valid, true, nullptr, {0, 6}},
+        {&mask708, nullptr, nullptr, nullptr, nullptr, nullptr, true, nullptr, {2, 3}},
+        {nullptr, nullptr, nullptr, &t2, &t4, nullptr, false, nullptr, {2, 3, 4}},
+        {nullptr, &far, &back, nullptr, nullptr, nullptr, true, nullptr, AnyVector(Any(6))},
+        {nullptr, &back, &two, nullptr, nullptr, nullptr, true, nullptr, {0, 1, 2}},
+        {nullptr, &two, &four, nullptr, nullptr, nullptr, true, &two, {2, 3}},
+        {nullptr, nullptr, nullptr, nullptr, nullptr, nullptr, true, &none, {}},
+        {nullptr, nullptr, nullptr, nullptr, &t4, nullptr, true, nullptr, AnyVector(Any(0))},
+        {&mask708, nullptr, nullptr, nullptr, &t4, nullptr, true, nullptr, {}},  // stopped by another type
+        {nullptr, nullptr, nullptr, nullptr, &t4, nullptr, false, nullptr, {0, 2, 3, 4}},
+    };
+    for (const auto& r : rows)
+        EXPECT_EQ(data.find(r.mask, r.start, r.end, r.from, r.to, r.valid, r.stop, r.most), r.expected)
+            << &r - rows;
     EXPECT_TRUE(QvCcData().find(nullptr, &two, &four, nullptr, nullptr, nullptr, true, nullptr).empty());
 }
 
@@ -245,17 +258,32 @@ TEST(QvCcProcessor, DealsOutWhatIsDueAndFillsUp) {
     EXPECT_THROW(queue.get(queue, MediaTime()), QvAssertFailure);
 }
 
+// Every code of a set, the extended ones behind the character that they replace.
+std::vector<int> wordsOf(int set, int first, int last) {
+    std::vector<int> words;
+    for (int code = first; code <= last; code += set == 0 ? 2 : 1) {
+        if (set == 0) words.push_back(code << 8 | (code + 1));
+        if (set >= 0x12) words.push_back(0x7800);
+        if (set != 0) words.insert(words.end(), 2, set << 8 | code);
+    }
+    return words;
+}
+
 TEST(QvCcText, ReadsAllCharacterSets) {
     const struct {
         int type;
         std::vector<int> words;
         const char* text;
     } rows[] = {
+        {0, wordsOf(0, 0x20, 0x3F), "!\"#$%&’()á+,-./0123456789:;<=>?"},
+        {0, wordsOf(0, 0x40, 0x5F), "@ABCDEFGHIJKLMNOPQRSTUVWXYZ[é]íó"},
+        {0, wordsOf(0, 0x60, 0x7F), "úabcdefghijklmnopqrstuvwxyzç÷Ññ█"},
+        {0, wordsOf(0x11, 0x30, 0x3F), "®°½¿™¢£♪à èâêîôû"},
+        {0, wordsOf(0x1A, 0x20, 0x3F), "ÁÉÓÚÜü‘¡*'—©℠•“”ÀÂÇÈÊËëÎÏïÔÙùÛ«»"},
+        {0, wordsOf(0x13, 0x20, 0x3F), "ÃãÍÌìÒòÕõ{}\\^_¦~ÄäÖöß¥¤│ÅåØø┌┐└┘"},
         {0, {0x9420, 0x9420, 0x9470, 0x9470, 0xC8E5, 0xECEC, 0xEF80, 0x942F}, "Hello"},
         {0, {0x9470, 0x6180, 0x94D0, 0x97A1, 0x6280}, "a|b"},                 // two rows, a tab
         {0, {0x91B0, 0x91B0, 0x91B0, 0x1137, 0x1939}, "®®♪"},                 // sent twice, meant once
-        {0, {0x2A5C, 0x5E5F, 0x607B, 0x7C7D, 0x7E27}, "áéíóúç÷Ññ’"},          // the basic set's own
-        {0, {0x4520, 0x1220, 0x5320, 0x9B34, 0x6F80, 0x1330}, "EÁSßÄ"},       // replace the one before
         {0, {0x6162, 0x1421, 0x91AE, 0x6380, 0x1C2D, 0x6480}, "a c|d"},       // back, style, return
         {1, {0x0105, 0x4142, 0x0F15, 0x152C, 0x4344, 0x0107, 0x4546}, "CD"},  // services between
         {0, {0x8080, 0x0000, 0x1240, 0x1180, 0x101F, 0x1F20}, ""},

@@ -76,7 +76,6 @@ TEST_F(Subtitles, SrtFiles) {
         {"times without an end", "1\n00:00:01,000\n00:00:03,000 --> 00:00:04,000\nb\n", "3000-4000 b\n"},
         {"great numbers", "99999999999999999999\n99:99:99,99999999999999999999 --> 00:00:01,000\na\n",
          std::to_string(((99 * 60 + 99) * 60 + 99) * 1000LL + 2147483647LL) + "-1000 a\n"},
-        {"nothing", "", ""},
         {"blank", "\n\r\n \n", ""},
     };
     for (const auto& c : cases) {
@@ -84,13 +83,10 @@ TEST_F(Subtitles, SrtFiles) {
         EXPECT_EQ(entries(), c.expected) << c.what;
         EXPECT_EQ(subtitles.unread(), 0) << c.what;
     }
-}
-
-TEST_F(Subtitles, ANumberWithoutTimesEndsAFileAndIsTold) {
-    const std::string rest = "7 dwarfs\n\n3\n00:00:05,000 --> 00:00:06,000\nlost\n";
-    EXPECT_EQ(parse("a.srt", "1\n00:00:01,000 --> 00:00:02,000\na\n\n" + rest), 0);
-    EXPECT_EQ(entries(), "1000-2000 a\n");
-    EXPECT_EQ(subtitles.unread(), static_cast<long long>(rest.size() - std::string("7 dwarfs\n").size()));
+    const std::string rest = "\n3\n00:00:05,000 --> 00:00:06,000\nlost\n";
+    EXPECT_EQ(parse("a.srt", "1\n00:00:01,000 --> 00:00:02,000\na\n\n7 dwarfs\n" + rest), 0);
+    EXPECT_EQ(entries(), "1000-2000 a\n") << "a number without times ends the file";
+    EXPECT_EQ(subtitles.unread(), static_cast<long long>(rest.size()));
 }
 
 TEST_F(Subtitles, SubFiles) {
@@ -98,68 +94,69 @@ TEST_F(Subtitles, SubFiles) {
         const char* what;
         std::string bytes;
         int status;
-        int format;
+        const char* format;
         std::string expected;
     } cases[] = {
-        {"two lines", "{10}{20}Line one|Line two\r\n{25}{50}{y:i}b", 0, 2,
+        {"two lines", "{10}{20}Line one|Line two\r\n{25}{50}{y:i}b", 0, "MicroDVD",
          "400-800 Line one|Line two\n1000-2000 {y:i}b\n"},
-        {"carriage return behind", "{10}{20}a\n\r\r{30}{40}b\n", 0, 2, "400-800 a\n1200-1600 b\n"},
-        {"carriage return only", "{10}{20}a\r{30}{40}b\r", 0, 2, "400-800 a\n1200-1600 b\n"},
-        {"no number", "{x}{}a\n", 0, 2, "0-0 a\n"},
-        {"a brace is open", "{10}{20}a\n{30", -1, 2, "400-800 a\n"},
-        {"a long number", "{10}{20}a\n{12345678901234567}{1}b\n", -1, 2, "400-800 a\n"},
-        {"the longest number", "{0000000000000025}{50}b\n", 0, 2, "1000-2000 b\n"},
-        {"one brace", "{10}{20}a\n{30}b\n", 0, 2, "400-800 a\n"},
-        {"text between", "{10}{20}a\nwords\n{30}{40}b", 0, 2, "400-800 a\n1200-1600 b\n"},
-        {"SRT in disguise", "1\n00:00:01,000 --> 00:00:02,000\na\n", 0, 1, "1000-2000 a\n"},
-        {"nothing", "", 0, 1, ""},
+        {"carriage returns", "{10}{20}a\n\r\r{30}{40}b\n", 0, "MicroDVD", "400-800 a\n1200-1600 b\n"},
+        {"carriage return only", "{10}{20}a\r{30}{40}b\r", 0, "MicroDVD", "400-800 a\n1200-1600 b\n"},
+        {"no number", "{x}{}a\n", 0, "MicroDVD", "0-0 a\n"},
+        {"a brace is open", "{10}{20}a\n{30", -1, "MicroDVD", "400-800 a\n"},
+        {"a long number", "{10}{20}a\n{12345678901234567}{1}b\n", -1, "MicroDVD", "400-800 a\n"},
+        {"the longest number", "{0000000000000025}{50}b\n", 0, "MicroDVD", "1000-2000 b\n"},
+        {"one brace", "{10}{20}a\n{30}b\n", 0, "MicroDVD", "400-800 a\n"},
+        {"text between", "{10}{20}a\nwords\n{30}{40}b", 0, "MicroDVD", "400-800 a\n1200-1600 b\n"},
+        {"SRT in disguise", "1\n00:00:01,000 --> 00:00:02,000\na\n", 0, "SubRip", "1000-2000 a\n"},
+        {"times and commas", "[x]\n00:00:01.000,00:00:02.000\na[br]b\n", 0, "SubViewer", "1000-2000 a|b\n"},
+        {"an open brace alone", "{10\n", 0, "SubRip", ""},
+        {"nothing", "", 0, "SubRip", ""},
     };
     for (const auto& c : cases) {
         EXPECT_EQ(parse("a.SUB", c.bytes), c.status) << c.what;
-        EXPECT_EQ(subtitles.format(), c.format) << c.what;
+        EXPECT_STREQ(subtitles.formatName(), c.format) << c.what;
+        EXPECT_EQ(subtitles.format() == QvSubtitles::SUB, c.format[0] == 'M') << c.what;
         EXPECT_EQ(entries(), c.expected) << c.what;
     }
-}
-
-TEST_F(Subtitles, RowsAreCounted) {
     parse("a.sub", "{1}{2}a|b||\n{3}{4}c\n");
     EXPECT_EQ(subtitles.at(0)->rows, 4);
     EXPECT_EQ(subtitles.at(1)->rows, 1);
     EXPECT_EQ(subtitles.maxRows(), 4);
     EXPECT_EQ(subtitles.at(0)->position, QvPoint(-1, -1));
-    EXPECT_THROW(subtitles.at(2), QvAssertFailure);
-    EXPECT_THROW(subtitles.at(-1), QvAssertFailure);
+    for (const int outside : {-1, 2}) EXPECT_THROW(subtitles.at(outside), QvAssertFailure);
 }
 
-TEST_F(Subtitles, MarksTellTheEncoding) {
+TEST_F(Subtitles, EncodingsAreToldByMarksAndBytes) {
     const std::u16string text = u"1\r\n00:00:01,000 --> 00:00:02,000\r\n\u00C4\u20AC\r\n";
+    const std::string narrow = "1\n00:00:01,000 --> 00:00:02,000\n", umlauts = "\xC3\x84\xE2\x82\xAC";
     std::string wide = "\xFF\xFE\0\0"s, wideSwapped = "\0\0\xFE\xFF"s;
     for (const char16_t c : text) {
         wide += {static_cast<char>(c & 255), static_cast<char>(c >> 8), '\0', '\0'};
         wideSwapped += {'\0', '\0', static_cast<char>(c >> 8), static_cast<char>(c & 255)};
     }
     const struct {
-        const char* what;
         std::string bytes;
         int encoding;
+        const char* name;
+        std::string expected;
     } cases[] = {
-        {"UTF-16, low byte first", "\xFF\xFE" + utf16(text, false), 3},
-        {"UTF-16, high byte first", "\xFE\xFF" + utf16(text, true), 2},
-        {"UTF-16 of this machine under the other mark", "\xFE\xFF" + utf16(text, false), 2},
-        {"UTF-32, low byte first", wide, 5},
-        {"UTF-32, high byte first", wideSwapped, 4},
+        {"\xEF\xBB\xBF" + narrow + umlauts, 1, "UTF-8", umlauts},
+        {"\xFE\xFF" + utf16(text, true), 2, "UTF-16BE", umlauts},
+        {"\xFE\xFF" + utf16(text, false), 2, "UTF-16BE", umlauts},  // the order of this machine
+        {"\xFF\xFE" + utf16(text, false), 3, "UTF-16LE", umlauts},
+        {wideSwapped, 4, "UTF-32BE", umlauts},
+        {wide, 5, "UTF-32LE", umlauts},
+        {narrow + umlauts, 0, "UTF-8", umlauts},
+        {narrow + "a", 0, "ASCII", "a"},
+        {narrow + "\xC4", 0, "8-bit", "\xC4"},
     };
     for (const auto& c : cases) {
-        EXPECT_EQ(parse("a.srt", c.bytes), 0) << c.what;
-        EXPECT_EQ(subtitles.encoding(), c.encoding) << c.what;
-        EXPECT_EQ(entries(), "1000-2000 \xC3\x84\xE2\x82\xAC\n") << c.what;
+        EXPECT_EQ(parse("a.srt", c.bytes), 0) << c.name;
+        EXPECT_EQ(subtitles.encoding(), c.encoding) << c.name;
+        EXPECT_STREQ(subtitles.encodingName(), c.name);
+        EXPECT_EQ(entries(), "1000-2000 " + c.expected + "\n") << c.name;
     }
-    parse("a.srt", "1\n00:00:01,000 --> 00:00:02,000\n\xC4\n");
-    EXPECT_EQ(entries(), "1000-2000 \xC4\n") << "bytes of an unknown encoding stay";
-    EXPECT_EQ(subtitles.encoding(), 0);
-}
-
-TEST_F(Subtitles, WhatGrowsBeyondItsFileIsCutAndTold) {
+    // What grows beyond its file is cut and told.
     const std::u16string line = u"{1}{2}" + std::u16string(30, u'\u732B') + u"\n";
     EXPECT_EQ(parse("a.sub", "\xFF\xFE" + utf16(line + line, false)), 0);
     EXPECT_EQ(subtitles.unread(), 2 * (7 + 90) - (2 * 2 * 37 - 2));
@@ -185,22 +182,29 @@ TEST_F(Subtitles, WhatIsNoSubtitleFileIsRefused) {
 
 TEST_F(Subtitles, SavedFilesReadBack) {
     parse("a.srt", "1\n00:00:01,500 --> 00:00:02,040\na|b\n\n2\n10:20:30,400 --> 10:20:31,000\n\n");
-    testing::internal::CaptureStdout();
-    EXPECT_EQ(subtitles.saveToFile(folder.file("b.srt").c_str(), QvSubtitles::SRT), 0);
-    const std::string echo = testing::internal::GetCapturedStdout();
-    EXPECT_EQ(
-        TempFolder::read(folder.file("b.srt")),
-        "1\r\n00:00:01,500 --> 00:00:02,040\r\na\r\nb\r\n\r\n2\r\n10:20:30,400 --> 10:20:31,000\r\n\r\n\r\n");
-    EXPECT_EQ(echo, "1\n00:00:01,500 --> 00:00:02,040\na\nb\n\n2\n10:20:30,400 --> 10:20:31,000\n\n\n");
-    testing::internal::CaptureStdout();
-    EXPECT_EQ(subtitles.saveToFile(folder.file("b.sub").c_str(), QvSubtitles::SUB), 0);
-    EXPECT_EQ(testing::internal::GetCapturedStdout(), "{37}{51}a|b\n{930760}{930775}\n");
-    EXPECT_EQ(TempFolder::read(folder.file("b.sub")), "{37}{51}a|b\r\n{930760}{930775}\r\n");
     const std::string before = entries();
+    const struct {
+        const char* name;
+        int format;
+        const char* bytes;
+    } files[] = {
+        {"c.x", 3, ""},
+        {"b.sub", 2, "{37}{51}a|b\r\n{930760}{930775}\r\n"},
+        {"b.srt", 1,
+         "1\r\n00:00:01,500 --> 00:00:02,040\r\na\r\nb\r\n\r\n"
+         "2\r\n10:20:30,400 --> 10:20:31,000\r\n\r\n\r\n"},
+    };
+    for (const auto& file : files) {
+        const auto format = static_cast<QvSubtitles::Format>(file.format);
+        testing::internal::CaptureStdout();
+        EXPECT_EQ(subtitles.saveToFile(folder.file(file.name).c_str(), format), 0);
+        std::string echo = testing::internal::GetCapturedStdout(), bytes = file.bytes;
+        EXPECT_EQ(TempFolder::read(folder.file(file.name)), bytes);
+        std::erase(bytes, '\r');
+        EXPECT_EQ(echo, bytes);
+    }
     ASSERT_EQ(subtitles.parseFile(folder.file("b.srt").c_str(), pal), 0);
     EXPECT_EQ(entries(), before);
-    EXPECT_EQ(subtitles.saveToFile(folder.file("c.x").c_str(), static_cast<QvSubtitles::Format>(3)), 0);
-    EXPECT_EQ(TempFolder::read(folder.file("c.x")), "");
     EXPECT_EQ(subtitles.saveToFile(folder.file("no/b.srt").c_str(), QvSubtitles::SRT), -1);
     FullDisc platform(10);
     PlatformScope scope(platform);

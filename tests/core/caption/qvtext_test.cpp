@@ -43,7 +43,7 @@ TEST(Text, EveryEncodingBecomesCodePoints) {
     }
 }
 
-TEST(Text, BuffersGoThereAndBack) {
+TEST(Text, BuffersAndWideStringsGoThereAndBack) {
     const std::string text = "a\xC3\xA9\xE2\x82\xAC\xF0\x9F\x98\x80";
     unsigned wide[16];
     char narrow[64];
@@ -56,35 +56,24 @@ TEST(Text, BuffersGoThereAndBack) {
     const unsigned bad[] = {0x110000, 0xD800, 0};
     QvText::utf32ToUtf8(bad, narrow);
     EXPECT_STREQ(narrow, "\xEF\xBF\xBD\xEF\xBF\xBD");
-}
-
-TEST(Text, StringsAndWideStrings) {
-    Any wide, narrow;
-    EXPECT_EQ(QvText::utf8ToWchar("\xE2\x82\xAC", wide), 0);
-    ASSERT_TRUE(wide.isWString());
-    EXPECT_EQ(wide.asWString()[0], 0x20AC);
-    EXPECT_EQ(QvText::wcharToUtf8(wide, narrow), 0);
-    EXPECT_EQ(narrow, "\xE2\x82\xAC");
-    EXPECT_EQ(QvText::stringToWchar(7, wide), -1);
-    EXPECT_FALSE(wide.isValid());
+    Any wideText, narrowText;
+    EXPECT_EQ(QvText::utf8ToWchar(text.c_str(), wideText), 0);
+    EXPECT_TRUE(wideText.isWString());
+    EXPECT_EQ(QvText::wcharToUtf8(wideText, narrowText), 0);
+    EXPECT_EQ(narrowText, text.c_str());
+    EXPECT_EQ(QvText::stringToWchar(7, wideText), -1);
+    EXPECT_FALSE(wideText.isValid());
 }
 
 TEST(Text, EncodingsCanBeChosen) {
-    AnyVector all;
-    all.append(Any("old"));
+    AnyVector all(Any("old"));
     QvText::availableEncodings(all);
     ASSERT_GT(all.size(), 10);
     const char* names[] = {"UTF-32", "UTF-16", "UTF-8", "ASCII"};
-    for (int i = 0; i < 4; ++i) {
-        EXPECT_EQ(all[i].asDict()["name"], names[i]);
-        EXPECT_EQ(all[i].asDict()["identifier"], 3 - i);
-    }
+    for (int i = 0; i < 4; ++i) EXPECT_EQ(all[i].asDict(), AnyDict("name", names[i], "identifier", 3 - i));
     EXPECT_EQ(QvText::encodingName(1256), "windows-1256");
     EXPECT_EQ(QvText::encodingName(0), "ASCII");
     EXPECT_EQ(QvText::encodingName(4), "N/A");
-}
-
-TEST(Text, NothingActsOnACommandLine) {
     EXPECT_EQ(QvText::cliEscape("a b; $(rm x)"), "'a b; $(rm x)'");
     EXPECT_FALSE(QvText::cliEscape(3).isValid());
 }

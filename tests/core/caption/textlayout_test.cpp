@@ -1,13 +1,19 @@
 #include <gtest/gtest.h>
 
+#include <algorithm>
+#include <climits>
 #include <string>
 #include <vector>
 
 #include "core/arch/platform.h"
 #include "core/caption/textlayout_p.h"
+#include "core/caption/textmask_p.h"
+#include "core/media/qvframe.h"
 #include "core/value/any.h"
 
 namespace {
+
+using Byte = unsigned char;
 
 // A font with the scripts that the tests need; not every system has one.
 std::string wideFont() {
@@ -45,54 +51,70 @@ class Layout : public testing::Test {
     FontFaces faces;
 };
 
-using Order = std::vector<int>;
-
-TEST_F(Layout, RightToLeftTextStandsInItsOrder) {
-    EXPECT_EQ(order(U"abc"), (Order{0, 1, 2}));
-    EXPECT_EQ(order(U"\u05D0\u05D1\u05D2"), (Order{2, 1, 0}));
-    EXPECT_EQ(order(U"\u05D0\u05D1 12"), (Order{3, 4, 2, 1, 0})) << "numbers keep their order";
-    EXPECT_EQ(order(U"ab \u05D0\u05D1"), (Order{0, 1, 2, 4, 3})) << "the first letter decides about the line";
-    EXPECT_EQ(order(U"\u05D0 ab"), (Order{2, 3, 1, 0}));
-    EXPECT_EQ(order(U"\u05D0<i>\u05D1</i>\u05D2"), (Order{9, 4, 0})) << "across faces";
-}
-
-TEST_F(Layout, BracketsAreMirrored) {
+TEST_F(Layout, CharactersStandInTheirOrder) {
+    const struct {
+        const char* what;
+        std::u32string_view text;
+        std::vector<int> order;
+    } rows[] = {
+        {"left to right", U"abc", {0, 1, 2}},
+        {"right to left", U"\u05D0\u05D1\u05D2", {2, 1, 0}},
+        {"numbers keep their order", U"\u05D0\u05D1 12", {3, 4, 2, 1, 0}},
+        {"the first letter decides about the line", U"ab \u05D0\u05D1", {0, 1, 2, 4, 3}},
+        {"and here, too", U"\u05D0 ab", {2, 3, 1, 0}},
+        {"across faces", U"\u05D0<i>\u05D1</i>\u05D2", {9, 4, 0}},
+        {"the last Arabic letter is the leftmost", U"\u0628\u0628\u0628", {2, 1, 0}},
+        {"lam and alef are one", U"\u0644\u0627", {0}},
+        {"marks that are not seen take no room", U"\uFEFFa\u200Bb\r\u200E", {1, 3}},
+    };
+    for (const auto& row : rows) EXPECT_EQ(order(row.text), row.order) << row.what;
     const auto glyphs = lay(U"\u05D0(\u05D1)").glyphs;
     ASSERT_EQ(glyphs.size(), 4u);
-    EXPECT_EQ(glyphs[0].glyph, faces[0].indexOf(U'('));
-    EXPECT_EQ(glyphs[2].glyph, faces[0].indexOf(U')'));
-}
-
-TEST_F(Layout, ArabicLettersTakeTheirForms) {
-    const auto joined = lay(U"\u0628\u0628\u0628").glyphs;
-    const auto alone = lay(U"\u0628").glyphs;
-    ASSERT_EQ(joined.size(), 3u);
+    EXPECT_EQ(glyphs[0].glyph, faces[0].indexOf(U'(')) << "brackets are mirrored";
+    const auto joined = lay(U"\u0628\u0628\u0628").glyphs, alone = lay(U"\u0628").glyphs;
     ASSERT_EQ(alone.size(), 1u);
-    EXPECT_EQ(joined[0].character, 2) << "the last letter is the leftmost";
-    EXPECT_NE(joined[0].glyph, joined[1].glyph);
-    EXPECT_NE(joined[1].glyph, joined[2].glyph);
-    for (const PlacedGlyph& form : joined) EXPECT_NE(form.glyph, alone[0].glyph);
-    EXPECT_EQ(lay(U"\u0644\u0627").glyphs.size(), 1u) << "lam and alef are one";
+    for (std::size_t i = 0; i < 3; ++i) {
+        EXPECT_NE(joined[i].glyph, joined[(i + 1) % 3].glyph) << "each place has its form";
+        EXPECT_NE(joined[i].glyph, alone[0].glyph);
+    }
 }
 
 TEST_F(Layout, KerningOnlyDrawsTogether) {
     const unsigned a = faces[0].indexOf(U'A'), v = faces[0].indexOf(U'V');
     ASSERT_LT(faces[0].kerning(a, v), 0);
     const auto pair = lay(U"AV").glyphs;
+    EXPECT_EQ(pair[0].pen, 64);
     EXPECT_EQ(pair[1].pen - pair[0].pen, faces[0].glyph(a).advance + faces[0].kerning(a, v));
     EXPECT_EQ(lay(U"AV").width, faces[0].glyph(a).advance / 64 + faces[0].glyph(v).advance / 64);
     const auto apart = lay(U"A<i>V").glyphs;
     EXPECT_EQ(apart[1].pen - apart[0].pen, faces[0].glyph(a).advance) << "not between two faces";
     EXPECT_EQ(faces[0].kerning(0, v), 0) << "nor with a glyph that is unknown";
+    const FontGlyph& first = faces[0].glyph(a);
+    EXPECT_FALSE(first.coverage.empty());
+    EXPECT_EQ(&faces[0].glyph(a), &first) << "drawn once";
+    EXPECT_TRUE(faces[0].glyph(UINT_MAX).coverage.empty());
 }
 
-TEST_F(Layout, MarksThatAreNotSeenTakeNoRoom) { EXPECT_EQ(order(U"\uFEFFa\u200Bb\r\u200E"), (Order{1, 3})); }
-
-TEST_F(Layout, GlyphsAreDrawnOnce) {
-    const FontGlyph& first = faces[0].glyph(faces[0].indexOf(U'g'));
-    EXPECT_FALSE(first.coverage.empty());
-    EXPECT_EQ(&faces[0].glyph(faces[0].indexOf(U'g')), &first);
-    EXPECT_TRUE(faces[0].glyph(UINT_MAX).coverage.empty());
+TEST(TextMask, OutlinesOfOneDotAndOfMore) {
+    const auto outlined = [](int radius) {
+        QvFrame letters, mask;
+        letters.init(QvFourcc::GRAY, 12, 10);
+        for (int y = 0; y < 10; ++y) std::fill_n(letters.pixelPtr(0, y), 12, Byte{});
+        *letters.pixelPtr(4, 4) = 0x81;
+        *letters.pixelPtr(8, 4) = 0x42;
+        *letters.pixelPtr(0, 9) = 0xFF;
+        outlineMask(letters, mask, radius);
+        std::string dots;
+        for (int y = 0; y < 10; ++y)
+            for (int x = 0; x < 12; ++x)
+                if (const int value = *mask.pixelPtr(x, y))
+                    dots += Any::sprintf("%d,%d:%02x ", x, y, value).asString();
+        return dots;
+    };
+    EXPECT_EQ(outlined(1),
+              "3,3:81 4,3:81 5,3:81 7,3:42 8,3:42 9,3:42 3,4:81 4,4:81 5,4:81 7,4:42 8,4:42 9,4:42 "
+              "3,5:81 4,5:81 5,5:81 7,5:42 8,5:42 9,5:42 0,8:ff 1,8:ff 0,9:ff 1,9:ff ");
+    EXPECT_EQ(outlined(2), "2,2:81 6,2:c3 4,4:81 8,4:42 2,6:81 6,6:c3 2,7:ff 0,9:ff ");
 }
 
 }  // namespace
