@@ -108,7 +108,7 @@ constexpr auto hexDigits = [] {
 std::uint16_t readWord(std::string_view token) {
     int value = 0;
     for (const char c : token) {
-        const signed char digit = hexDigits[static_cast<unsigned char>(c)];
+        const int digit = hexDigits[static_cast<unsigned char>(c)];
         if (digit < 0)
             return static_cast<std::uint16_t>(std::strtol(std::string(token).c_str(), nullptr, 16));
         value = value * 16 + digit;
