@@ -19,15 +19,22 @@ enum class Samples {
 
 Samples samplesOf(unsigned fourcc);
 
-// The row between `above` and `below` of one field, `other` being the row that the other field has there. For
-// each sample, with w from 0 to 256:
+// Three neighbouring rows of a frame; `at` is of the other field than the two around it.
+struct Triple {
+    const Byte *above, *at, *below;
+};
+
+// Fills a missing row of the field that `above` and `below` are of. For each sample, with w from 0 to 256,
+// and a step being 1 of 256 levels:
 //
 //     mean   = (above + below + 1) >> 1
-//     median = the middle one of above, below and other
-//     row    = (mean * (256 - w) + median * w + 128) >> 8
+//     change = the most that a sample of the triple differs from the one in `before`, the triple of the frame
+//              before; anything from 12 steps on, and no such frame (null rows), is motion
+//     room   = 32 * (12 steps - change), at least 0
+//     woven  = at, but no more than `room` below or above both of its neighbours
+//     row    = (mean * (256 - w) + woven * w + 128) >> 8
 //
 // Rows begin at any address and have any length; `row` overlaps none of the others.
-void fillRow(Samples samples, Byte* row, const Byte* above, const Byte* below, const Byte* other, int w,
-             std::size_t bytes);
+void fillRow(Samples samples, Byte* row, const Triple& now, const Triple& before, int w, std::size_t bytes);
 
 }  // namespace qvbob

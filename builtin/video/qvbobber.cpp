@@ -33,29 +33,28 @@ bool doubleRate(QvFramerate& rate) {
     return true;
 }
 
-// Makes the rows of `to` that its field lacks, from what `from` has in and between them.
-void fillMissing(QvFrame& to, const QvFrame& from, Field field, int weight) {
-    const auto samples = qvbob::samplesOf(from.four_cc());
-    for (int p = 0; p < to.planes(); ++p) {
-        const std::ptrdiff_t stride = from.stride(p), toStride = to.stride(p);
-        if (stride <= 0 || toStride <= 0) continue;
-        const auto count = std::min(from.plane_bytes(p) / stride, to.plane_bytes(p) / toStride);
-        const auto bytes = static_cast<std::size_t>(std::min(stride, toStride));
-        for (std::ptrdiff_t row = field == Field::top ? 1 : 0; row < count; row += 2) {
-            const unsigned char* other = from.plane(p) + row * stride;
-            const unsigned char* above = row > 0 ? other - stride : nullptr;
-            const unsigned char* below = row + 1 < count ? other + stride : nullptr;
-            if (!above && !below) above = below = other;
-            qvbob::fillRow(samples, to.plane(p) + row * toStride, above ? above : below,
-                           below ? below : above, other, weight, bytes);
-        }
-    }
+// The rows around row `row` of a plane; a row that is not there is the one on the other side.
+qvbob::Triple rowsAround(const QvFrame& frame, int plane, int row, int rows) {
+    const std::ptrdiff_t stride = frame.stride(plane);
+    const unsigned char* at = frame.plane(plane) + row * stride;
+    const bool isFirst = row == 0, isLast = row + 1 >= rows;
+    if (isFirst && isLast) return {at, at, at};
+    return {isFirst ? at + stride : at - stride, at, isLast ? at - stride : at + stride};
 }
 
-int showField(QvFrame& to, const QvFrame& from, Field field, int weight) {
-    if (const int status = beginWeave(to, from, field)) return status;
-    fillMissing(to, from, field, weight);
-    return doubleRate(to.framerate) ? QvStatus::ok : QvStatus::invalidArgument;
+// Makes the rows of `to` that its field lacks, from what `from` has in and between them.
+void fillMissing(QvFrame& to, const QvFrame& from, const QvFrame* before, Field field, int weight) {
+    const auto samples = qvbob::samplesOf(from.four_cc());
+    for (int p = 0; p < to.planes(); ++p) {
+        const RowShape shape = commonRows(to, from, p);
+        const std::ptrdiff_t stride = to.stride(p);
+        for (int row = field == Field::top ? 1 : 0; row < shape.rows; row += 2) {
+            const auto now = rowsAround(from, p, row, shape.rows);
+            const auto old = before ? rowsAround(*before, p, row, shape.rows) : qvbob::Triple();
+            qvbob::fillRow(samples, to.plane(p) + row * stride, now, old, weight,
+                           static_cast<std::size_t>(shape.bytes));
+        }
+    }
 }
 
 }  // namespace
@@ -83,6 +82,7 @@ int QvBobber::open() {
 int QvBobber::close() {
     left_ = 0;
     second_.destroy();
+    before_.destroy();
     return VideoEffectOf::close();
 }
 
@@ -93,11 +93,18 @@ int QvBobber::write(QvFrame& frame) {
     return result;
 }
 
+int QvBobber::show(QvFrame& to, const QvFrame& frame, Field field) const {
+    if (const int status = beginWeave(to, frame, field)) return status;
+    const int weight = settings_.alpha + (settings_.alpha + 1) / (mostAlpha + 1);  // 255 is the whole
+    fillMissing(to, frame, sameShape(before_, frame) ? &before_ : nullptr, field, weight);
+    return doubleRate(to.framerate) ? QvStatus::ok : QvStatus::invalidArgument;
+}
+
 int QvBobber::fill(const QvFrame& frame) {
     const Field first = frame.framerate.interlaced() == 2 ? Field::bottom : Field::top;
-    const int weight = settings_.alpha + (settings_.alpha + 1) / (mostAlpha + 1);  // 255 is the whole
-    int status = showField(output_, frame, first, weight);
-    if (status == QvStatus::ok) status = showField(second_, frame, otherField(first), weight);
+    int status = show(output_, frame, first);
+    if (status == QvStatus::ok) status = show(second_, frame, otherField(first));
+    if (status == QvStatus::ok && settings_.alpha > 0) status = copyFields(before_, frame);
     if (status != QvStatus::ok) return setError(status, "can not make two frames of one");
     if (!started_) nextNumber_ = 2LL * frame.frameNr;
     started_ = true;
