@@ -68,8 +68,13 @@ int SubImporter::open() {
     if (getState() == stateOpen) close();
     subtitles_.emplace();
     if (subtitles_->parseFile(filename(), settings_.framerate) != QvStatus::ok) {
+        const int before = subtitles_->nrSubtitles();
+        const std::string name = textOf(filename());
         subtitles_.reset();
-        return setError(QvStatus::cannotParse, "Failed to read subtitle file %s", textOf(filename()).c_str());
+        if (before > 0)
+            return setError(QvStatus::cannotParse, "Subtitle file %s: what follows subtitle %d is malformed",
+                            name.c_str(), before);
+        return setError(QvStatus::cannotParse, "Subtitle file %s can't be read or is no text", name.c_str());
     }
     warn();
     fileSize_ = QvFile::flength(filename());

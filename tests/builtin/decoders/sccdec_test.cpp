@@ -66,9 +66,9 @@ TEST_F(SccDecoder, ShowsTwoFieldsAsOneStream) {
     EXPECT_EQ(decoder.getSubpicParam(0, "pairs"), Any(7));
     EXPECT_EQ(decoder.getParam("filename"), (one + "," + two).c_str());
     EXPECT_TRUE(decoder.getParam("framerate").asFramerate() == QvFramerate::f29p());
-    const AnyDict times = decoder.getParam("inOut");
-    EXPECT_EQ(times, AnyDict("inField1", frameTime(2), "outField1", frameTime(29), "inField2", frameTime(2),
-                             "outField2", frameTime(31)));
+    EXPECT_EQ(decoder.getParam("inOut").asDict(),
+              AnyDict("inField1", frameTime(2), "outField1", frameTime(29), "inField2", frameTime(2),
+                      "outField2", frameTime(31)));
     const std::string all = "2: 0 9420 0 942c 1 1520; 5: 0 94ae; 28: 1 1520; 29: 0 942f; 31: 1 15ae";
     EXPECT_EQ(readAll(), all);
     EXPECT_EQ(decoder.readFrame(0), QvStatus::endOfStream);
@@ -83,6 +83,8 @@ TEST_F(SccDecoder, ShowsTwoFieldsAsOneStream) {
     decoder.seekToFrame(0, 0);
     decoder.setParam("offset", frameTime(20));
     EXPECT_EQ(decoder.getParam("timeOffset").asMediaTime(), frameTime(20));
+    EXPECT_EQ(decoder.getSubpicParam(0, "first").asMediaTime(), frameTime(-18));
+    EXPECT_EQ(decoder.getSubpicParam(0, "last").asMediaTime(), frameTime(11));
     EXPECT_EQ(readAll(), "8: 1 1520; 9: 0 942f; 11: 1 15ae");
     AnyDict dict;
     decoder.seekToFrame(9, 0);
@@ -150,32 +152,25 @@ TEST_F(SccDecoder, OpensWhatHasCaptions) {
         EXPECT_EQ(decoder.setParam(name, value), QvStatus::invalidParam) << name;
 }
 
-// Cut at every byte and with bits turned, a file opens and reads, or is refused.
+// Cut at every byte and with every bit turned, a file opens and reads, or is refused.
 TEST_F(SccDecoder, DamagedFilesDoNoHarm) {
-    const std::string whole = std::string(header) +
-                              "00:00:14:01\t9420 9420 94ae\n\n00:00:17:26\t9420 97a1 10ae 46f2\r\n" +
-                              std::string(90, '9');
+    const std::string whole = std::string(header) + "00:00:14:01\t9420 94ae\n\n00:00:17:26\t9420 97a1\r\n";
     int opened = 0;
-    const auto attempt = [&](const std::string& bytes) {
+    for (std::size_t i = 0; i < whole.size() * 9; ++i) {
+        std::string bytes = whole.substr(0, i < whole.size() * 8 ? whole.size() : i - whole.size() * 8);
+        if (i < whole.size() * 8) bytes[i / 8] = static_cast<char>(bytes[i / 8] ^ 1 << i % 8);
         const int result = open(folder.write("x.scc", bytes));
-        EXPECT_TRUE(result == 0 || result == -9) << result;
-        if (result == 0) {
+        ASSERT_TRUE(result == 0 || result == QvStatus::cannotParse) << result;
+        const AnyDict times = decoder.getParam("inOut");
+        for (const char* end : {"inField1", "outField1"}) {
+            if (result != 0) continue;
             ++opened;
-            const AnyDict times = decoder.getParam("inOut");
-            for (const char* end : {"inField1", "outField1"}) {
-                EXPECT_EQ(decoder.seek(times[end].asMediaTime(), qvSubpicStream, 0), 0);
-                EXPECT_NE(readAll(1), "") << bytes;
-            }
+            EXPECT_EQ(decoder.seek(times[end].asMediaTime(), qvSubpicStream, 0), 0);
+            EXPECT_NE(readAll(1), "") << bytes;
         }
         decoder.close();
-    };
-    for (std::size_t size = 0; size < whole.size(); ++size) attempt(whole.substr(0, size));
-    EXPECT_GT(opened, 50);
-    for (std::size_t bit = 0; bit < whole.size() * 8; ++bit) {
-        std::string turned = whole;
-        turned[bit / 8] = static_cast<char>(turned[bit / 8] ^ 1 << bit % 8);
-        attempt(turned);
     }
+    EXPECT_GT(opened, 500);
 }
 
 // An encoder that puts captions into its stream: what its queue deals out, fillers left out.

@@ -101,7 +101,7 @@ TEST_F(Importer, NothingIsAnsweredBeforeOpen) {
 
 TEST_F(Importer, BadFilesAreRefusedOrTold) {
     EXPECT_EQ(open("a.sub", "{1}{2}a\n{3"), -9);
-    EXPECT_NE(std::string(decoder.errorDesc()).find("a.sub"), std::string::npos);
+    EXPECT_NE(std::string(decoder.errorDesc()).find("a.sub: what follows subtitle 1"), std::string::npos);
     EXPECT_EQ(open("a.srt", std::string("\0\0\1", 3)), -9);
     decoder.setParam("filename", folder.file("none.srt").c_str());
     EXPECT_EQ(decoder.open(), -9);
