@@ -236,11 +236,13 @@ void Job::planLengths() {
     }
     for (JobStream& stream : streams_) {
         if (stream.type != kAudio) continue;
-        if (video)
+        stream.own = stream.out.position(stream.samplerate) - stream.in.position(stream.samplerate);
+        stream.expected = stream.own;
+        if (video) {
             stream.expected =
                 QvUtil::samplesForFrames(static_cast<int>(video->expected), video->rate, stream.samplerate);
-        else
-            stream.expected = stream.out.position(stream.samplerate) - stream.in.position(stream.samplerate);
+            stream.frame = QvUtil::samplesForFrames(1, video->rate, stream.samplerate) + 1;
+        }
         stream.inUnits = stream.expected;
     }
 }

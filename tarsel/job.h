@@ -43,6 +43,8 @@ struct JobStream {
     MediaTime in, out;       // in the source
     long long inUnits = 0;   // frames or samples between the points
     long long expected = 0;  // frames or samples of the output
+    long long own = 0;       // audio: samples of the output that the source itself has
+    long long frame = 0;     // audio: most samples that belong to one frame of the picture; 0 without one
     long long written = -1;  // after the run
     ProcessParams params;
     long long bytes(long long units) const;  // without headers

@@ -165,6 +165,7 @@ class QV_API TransVLink : public TransLink {
     void endStep(Step& step);
     void repeatLast(Step& step);
     int _processOneFrame();
+    QvFrame* completePair();
     void feedMetaSources(QvFrame* frame);
     void makeIcon(QvFrame* frame) const;
     int writeFrame(QvFrame* frame);
@@ -175,6 +176,7 @@ class QV_API TransVLink : public TransLink {
     std::unique_ptr<QvVProcessPipe> videoPipe_;  // null when no processing is needed
     int nrFramesIn_ = 0;                         // frames to read, from in to out point
     int nrFramesOut_ = 0;                        // frames that the encoder is to get
+    bool pairCompleted_ = false;                 // nrFramesIn_ is one more than the range has
     int framesWritten_ = 0;                      // -1 after close
     int startFrame_ = 0;                         // at the input rate
     int stopFrame_ = 0;                          // inclusive

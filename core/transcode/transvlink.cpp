@@ -26,6 +26,7 @@ TransVLink& TransVLink::operator=(const TransVLink& other) {
     outFramerate_ = other.outFramerate_;
     nrFramesIn_ = other.nrFramesIn_;
     nrFramesOut_ = other.nrFramesOut_;
+    pairCompleted_ = other.pairCompleted_;
     framesWritten_ = -1;
     startFrame_ = other.startFrame_;
     stopFrame_ = other.stopFrame_;
@@ -136,8 +137,9 @@ int TransVLink::takeFrameRange(const AnyDict* params, const AnyDict& stream) {
         return setError(QvStatus::failed, "The out point does not lie behind the in point");
     nrFramesIn_ = stopFrame_ - startFrame_ + 1;
     // Two frames go into each one when the rate is halved.
-    if (nrFramesIn_ % 2 != 0 &&
-        QvNum::equ(2.0 * outFramerate_.rate().ratio(), inRate.rate().ratio(), QvRatio::tolerance)) {
+    pairCompleted_ = nrFramesIn_ % 2 != 0 && QvNum::equ(2.0 * outFramerate_.rate().ratio(),
+                                                        inRate.rate().ratio(), QvRatio::tolerance);
+    if (pairCompleted_) {
         ++stopFrame_;
         ++nrFramesIn_;
     }

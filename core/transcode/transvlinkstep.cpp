@@ -116,14 +116,29 @@ void TransVLink::repeatLast(Step& step) {
 int TransVLink::_processOneFrame() {
     int result = videoPipe_->process(nullptr, 0);
     while (result == QvStatus::needsInput) {
-        if (const int read = decoder_->readFrame(decStreamNr_)) return read;
-        auto* frame = decoder_->getFramePtr(decStreamNr_);
-        if (!frame) return QvStatus::failed;
-        feedMetaSources(frame);
+        const int read = decoder_->readFrame(decStreamNr_);
+        QvFrame* frame = read == QvStatus::endOfStream ? completePair() : nullptr;
+        if (read != QvStatus::ok && !frame) return read;
+        if (read == QvStatus::ok) {
+            frame = decoder_->getFramePtr(decStreamNr_);
+            if (!frame) return QvStatus::failed;
+            feedMetaSources(frame);
+        }
         videoPipe_->write(*frame);
         result = videoPipe_->process(nullptr, 0);
     }
     return result;
+}
+
+// Where a halving takes one frame more than the stream has, the last one serves twice; otherwise null.
+QvFrame* TransVLink::completePair() {
+    if (!pairCompleted_ || static_cast<int>(videoPipe_->framesIn()) + 1 != nrFramesIn_) return nullptr;
+    QvFrame* last = decoder_->getFramePtr(decStreamNr_);
+    if (!last || !last->inited() || last->frameNr < 0) return nullptr;
+    ++last->frameNr;
+    last->clearUserData();
+    last->clearSubpic();
+    return last;
 }
 
 // A frame carries the captions of its own time, or none.
