@@ -24,8 +24,4 @@ void packLine(const Format& format, const Line8& from, Byte* to, int width);
 void unpackLine(const Format& format, const Byte* from, const Byte* chroma, const Line16& to, int width);
 void packLine(const Format& format, const Line16& from, Byte* to, Byte* chroma, int width);
 
-// A line of one plane of words with `depth` bits each.
-void raiseWords(uint16_t* to, const Byte* from, int n, int depth);
-void lowerWords(Byte* to, const uint16_t* from, int n, int depth);
-
 }  // namespace srk

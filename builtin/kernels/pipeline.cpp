@@ -6,6 +6,7 @@
 
 #include "builtin/kernels/deep.h"
 #include "builtin/kernels/lines.h"
+#include "builtin/kernels/rows16.h"
 #include "builtin/kernels/rows8.h"
 
 namespace srk {
@@ -85,7 +86,7 @@ class Band {
             S* place = sourcePlace(plane, y, fresh);
             if (!fresh) return place;
             if (format.packing == Packing::planar16)
-                raiseWords(place, line, source_.planeWidth(plane), source_.depth);
+                raiseWords(place, line, count(source_.planeWidth(plane)), source_.depth);
             else
                 widen(place, line, count(source_.planeWidth(plane)), false);
             return place;
@@ -133,7 +134,7 @@ class Band {
                     widen(places[p], bytes.plane[p], count(n), fullRange(format, p));
                 }
             }
-            if (plan_.rgbToYuv) deepMatrix(deepRows(), places, places, width);
+            if (plan_.rgbToYuv) deepMatrix(deepRows(), places, places, count(width));
         }
     }
 
@@ -183,8 +184,7 @@ class Band {
             if (line != to) std::memcpy(to, line, count(width) * sizeof(S));
             return;
         }
-        if constexpr (!deep)
-            if (group.spread != Group::none) return bytesInto(stage, plane, y, to);
+        if (group.spread != Group::none) return spreadInto(stage, plane, y, to);
         const Axis& down = group.down;
         const Word* words[maxTaps];
         for (int t = 0; t < down.taps; ++t) {
@@ -195,7 +195,7 @@ class Band {
         if constexpr (deep) {
             static constexpr float one = 1;
             deepDown(words, down.copies ? &one : down.exact.data() + count(y) * count(down.taps), down.taps,
-                     to, width);
+                     to, count(width));
         } else {
             scaleDown(words, down.copies ? nullptr : down.weights.data() + count(y) * count(down.taps),
                       down.taps, to, width);
@@ -203,14 +203,14 @@ class Band {
     }
 
     // Down first, while lines are short.
-    void bytesInto(int stage, int plane, int y, Byte* to) {
+    void spreadInto(int stage, int plane, int y, S* to) {
         const Group& group = scaling(stage).of(plane);
         const int width = group.across.target;
         const bool asIs = group.spread == Group::asIs;
         const int n = asIs ? width : group.across.source;
-        const Byte* line = downBytes(stage, plane, y, asIs ? to : lines_.padded.get(), n);
+        const S* line = downSamples(stage, plane, y, asIs ? to : lines_.padded.get(), n);
         if (asIs) {
-            if (line != to) std::memcpy(to, line, count(n));
+            if (line != to) std::memcpy(to, line, count(n) * sizeof(S));
         } else if (group.spread == Group::doubled) {
             doubleLine(to, line, count(width));
         } else if (group.spread == Group::everySecond) {
@@ -222,7 +222,7 @@ class Band {
     }
 
     // The source line itself where it is copied, else `to`.
-    const Byte* downBytes(int stage, int plane, int y, Byte* to, int n) {
+    const S* downSamples(int stage, int plane, int y, S* to, int n) {
         const Group& group = scaling(stage).of(plane);
         const Axis& down = group.down;
         const auto at = [&](int line) {
@@ -232,13 +232,20 @@ class Band {
         const int start = down.start[count(y)];
         if (down.taps == 1) return at(start);
         const size_t first = count(y) * count(down.taps);
-        const Byte* taps[maxTaps];
+        const S* taps[maxTaps];
         for (int t = 0; t < down.taps; ++t) {
-            if (down.weights[first + count(t)] == unity) return at(start + t);
+            if (copiesTap(down, first + count(t))) return at(start + t);
             taps[t] = at(start + t);
         }
-        scaleDownBytes(taps, group.bytesDown.data() + first, down.taps, to, n);
+        if constexpr (deep)
+            deepDown(taps, down.exact.data() + first, down.taps, to, count(n));
+        else
+            scaleDownBytes(taps, group.bytesDown.data() + first, down.taps, to, n);
         return to;
+    }
+
+    static bool copiesTap(const Axis& axis, size_t tap) {
+        return deep ? axis.exact[tap] == 1 : axis.weights[tap] == unity;
     }
 
     const Word* wordLine(int stage, int plane, int y) {
@@ -248,7 +255,7 @@ class Band {
         const Group& group = scaling(stage).of(plane);
         const S* line = upstream(stage, plane, y);
         if constexpr (deep) {
-            deepAcross(group.across, line, lines_.paddedWide.get(), place);
+            deepAcross(group.across, group.deepAcross, line, lines_.paddedWide.get(), place);
         } else {
             if (group.bytesAcross.form != Across::copy) {
                 Byte* padded = lines_.padded.get() + beforeLine;
@@ -279,7 +286,7 @@ class Band {
         for (int p = 0; p < 3; ++p) from[p] = scaledLine(0, p, y);
         const size_t width = count(plan_.request.width);
         if constexpr (deep) {
-            deepMatrix(deepRows(), from, places, plan_.request.width);
+            deepMatrix(deepRows(), from, places, width);
         } else if (plan_.yuvToRgb) {
             yuvToRgb(rgbRows(), from[0], from[1], from[2], places[0], places[1], places[2], width);
         } else if (plan_.otherMatrix) {
@@ -320,7 +327,7 @@ class Band {
                                  reinterpret_cast<uintptr_t>(line) % alignof(uint16_t) == 0;
             if (inPlace) return finalInto(plane, y, reinterpret_cast<uint16_t*>(line), width);
             if (format.packing == Packing::planar16)
-                lowerWords(line, finalLine(plane, y), width, target_.depth);
+                lowerWords(line, finalLine(plane, y), count(width), target_.depth);
             else
                 narrow(line, finalLine(plane, y), count(width), false);
         }

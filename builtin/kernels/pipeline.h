@@ -25,7 +25,7 @@ struct Lines {
     Ring<S> source[planes];
     Stage stages[2];
     Ring<S> matrixed[planes];
-    Block<S> padded;  // bytes: a line with its ends repeated; words: unused
+    Block<S> padded;  // a line with its ends repeated, or one that goes on across
     Block<float> paddedWide;
     Block<Byte> narrow;  // four lines of bytes beside 16-bit ones
     size_t narrowLength = 0;

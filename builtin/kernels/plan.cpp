@@ -57,7 +57,11 @@ struct Maker {
         Group made;
         made.across = std::move(across);
         made.down = std::move(down);
-        if (!plan.deep && !made.empty() && made.across.target > 0) made.bytesAcross = makeAcross(made.across);
+        if (made.empty() || made.across.target == 0) return made;
+        if (plan.deep)
+            made.deepAcross = makeDeepAcross(made.across);
+        else
+            made.bytesAcross = makeAcross(made.across);
         return made;
     }
 
@@ -71,11 +75,15 @@ struct Maker {
                                           : Group::none;
     }
 
-    // Where nothing is filtered across, or by two, the pass down works on bytes, if its weights let it.
+    // Where nothing is filtered across, or by two, the pass down works on samples, if its weights let it.
     void setSpread(Group& group, Group::Spread spread) const {
-        if (plan.deep || group.empty() || group.across.target == 0) return;
+        if (group.empty() || group.across.target == 0) return;
         if (group.across.copies) spread = Group::asIs;
         if (spread == Group::none) return;
+        if (plan.deep) {
+            group.spread = spread;
+            return;
+        }
         group.bytesDown = downBytesWeights(group.down);
         if (group.down.copies || group.down.taps == 1 || !group.bytesDown.empty()) group.spread = spread;
     }

@@ -7,6 +7,7 @@
 #include <mutex>
 #include <vector>
 
+#include "builtin/kernels/deep.h"
 #include "builtin/kernels/formats.h"
 #include "builtin/kernels/matrix.h"
 #include "builtin/kernels/paths.h"
@@ -30,8 +31,9 @@ struct Request {
 struct Group {
     Axis across, down;
     Across bytesAcross;
-    // Bytes that need no words between the passes: across, lines are copied, or chroma of every second pixel
-    // is repeated, interpolated or picked out behind the pass down.
+    DeepAcross deepAcross;
+    // Samples that need no words between the passes: across, lines are copied, or chroma of every second
+    // pixel is repeated, interpolated or picked out behind the pass down.
     enum Spread : uint8_t { none, asIs, repeated, doubled, everySecond } spread = none;
     std::vector<int8_t> bytesDown;  // of the pass down, for each line
     bool copies() const { return across.copies && down.copies; }
