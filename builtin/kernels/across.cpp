@@ -130,6 +130,19 @@ bool isHalves(const Axis& axis) {
     return true;
 }
 
+// Samples four apart whose eight weights are the same for all.
+bool isQuarters(const Axis& axis) {
+    if (axis.taps != 8) return false;
+    const int16_t* w = axis.weights.data();
+    for (int t = 0; t < 4; ++t)
+        if (!byteFits(w[t]) || !byteFits(w[t + 4]) || !pairFits(w[t], w[t + 4])) return false;
+    for (int i = 0; i < axis.target; ++i)
+        if (axis.start[static_cast<size_t>(i)] != axis.start[0] + 4 * i ||
+            !std::equal(w, w + 8, weightsOf(axis, i)))
+            return false;
+    return true;
+}
+
 bool fitsRuns(const Axis& axis) {
     for (int i = 0; i < axis.target; ++i) {
         const int16_t* w = weightsOf(axis, i);
@@ -158,6 +171,9 @@ Across makeAcross(const Axis& axis) {
     const int windows = axis.taps > 1 ? windowsOf(axis) : 0;
     if (isHalves(axis)) {
         across.form = Across::halves;
+    } else if (isQuarters(axis)) {
+        across.form = Across::quarters;
+        makeRuns(axis, across);
     } else if (windows) {
         makeBlocks(axis, across, windows);
     } else if (axis.taps > 1 && fitsRuns(axis)) {

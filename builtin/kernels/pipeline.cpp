@@ -100,8 +100,10 @@ class Band {
         for (int p = 1; p < 4; ++p) places[p] = sourcePlace(p, y, ignored);
         if constexpr (!deep)
             if (S* target = targetLuma(y)) places[0] = target;
+        const S* line = places[plane];
+        if (!plan_.alpha) places[3] = nullptr;
         if (fresh) unpack(y, places);
-        return places[plane];
+        return line;
     }
 
     // The target's own line, if luma goes there as it is and the line is one of this band.
@@ -116,12 +118,12 @@ class Band {
         const Byte* line = lineOf(source_, 0, y);
         const int width = source_.width;
         if constexpr (!deep) {
+            Byte* const u = lumaTarget() ? nullptr : places[1];
             if (plan_.rgbToYuv && format.packing == Packing::bytes4)
-                return rgb4ToYuv(yuvRows(), line, places[0], places[1], places[2], count(width));
+                return rgb4ToYuv(yuvRows(), line, places[0], u, places[2], count(width));
             unpackLine(format, line, Line8{{places[0], places[1], places[2], places[3]}}, width);
             if (plan_.rgbToYuv)
-                rgbToYuv(yuvRows(), places[0], places[1], places[2], places[0], places[1], places[2],
-                         count(width));
+                rgbToYuv(yuvRows(), places[0], places[1], places[2], places[0], u, places[2], count(width));
         } else {
             if (format.deep()) {
                 const Byte* chroma = format.packing == Packing::nv16 ? lineOf(source_, 1, y) : nullptr;
@@ -129,14 +131,19 @@ class Band {
             } else {
                 const Line8 bytes = narrowLines();
                 unpackLine(format, line, bytes, width);
-                for (int p = 0; p < (format.alpha() ? 4 : 3); ++p) {
+                for (int p = 0; p < (plan_.alpha ? 4 : 3); ++p) {
                     const int n = p == 1 || p == 2 ? source_.planeWidth(p) : width;
                     widen(places[p], bytes.plane[p], count(n), fullRange(format, p));
                 }
             }
-            if (plan_.rgbToYuv) deepMatrix(deepRows(), places, places, count(width));
+            if (!plan_.rgbToYuv) return;
+            S* const yuv[3] = {places[0], lumaTarget() ? nullptr : places[1], places[2]};
+            deepMatrix(deepRows(), places, yuv, count(width));
         }
     }
+
+    // No chroma is asked for.
+    bool lumaTarget() const { return target_.format->has(lumaOnly); }
 
     const ToYuv& yuvRows() const {
         return toYuv(plan_.request.targetMatrix, source_.format->family() == Family::video);
@@ -166,9 +173,14 @@ class Band {
         return stage ? matrixedLine(plane, y) : sourceLine(plane, y);
     }
 
+    // Chroma of a source that has none.
+    bool isNeutral(int stage, int plane) const {
+        return stage == 0 && (plane == 1 || plane == 2) && source_.format->has(lumaOnly);
+    }
+
     const S* scaledLine(int stage, int plane, int y) {
         const Group& group = scaling(stage).of(plane);
-        if (group.empty()) return lines_.neutral.get();
+        if (group.empty() || isNeutral(stage, plane)) return lines_.neutral.get();
         if (group.copies()) return upstream(stage, plane, y + group.down.offset) + group.across.offset;
         bool fresh;
         S* place = lines_.stages[stage].out[plane].at(y, fresh);
@@ -179,7 +191,7 @@ class Band {
     void scaledInto(int stage, int plane, int y, S* to) {
         const Group& group = scaling(stage).of(plane);
         const int width = group.across.target;
-        if (group.empty() || group.copies()) {
+        if (group.empty() || group.copies() || isNeutral(stage, plane)) {
             const S* line = scaledLine(stage, plane, y);
             if (line != to) std::memcpy(to, line, count(width) * sizeof(S));
             return;

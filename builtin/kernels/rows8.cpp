@@ -129,19 +129,65 @@ void pack3to4(Byte* to, const Byte* from, size_t n) {
     }
 }
 
-void reverse4(Byte* to, const Byte* from, size_t n) {
+// Fields of 5 and 6 bits spread over 8, and round(value * most / 255).
+HWY_INLINE Byte five(unsigned value) { return static_cast<Byte>((value & 31) << 3 | (value & 31) >> 2); }
+HWY_INLINE Byte six(unsigned value) { return static_cast<Byte>((value & 63) << 2 | (value & 63) >> 4); }
+HWY_INLINE unsigned toBits(unsigned value, unsigned most) { return (value * most + 127) / 255; }
+
+#if QV_VECTORS
+using VU16 = hn::Vec<decltype(hn::Repartition<uint16_t, D8>())>;
+const hn::Rebind<uint8_t, decltype(hn::Repartition<uint16_t, D8>())> halfBytes;
+HWY_INLINE void putNarrow(VU16 words, Byte* to) {
+    hn::StoreU(hn::DemoteTo(halfBytes, hn::BitCast(d16, words)), halfBytes, to);
+}
+HWY_INLINE VU16 loadWide(const Byte* from) { return hn::PromoteTo(du16, hn::LoadU(halfBytes, from)); }
+HWY_INLINE VU16 fiveWords(VU16 word) {
+    const auto value = hn::And(word, hn::Set(du16, 31));
+    return hn::Or(hn::ShiftLeft<3>(value), hn::ShiftRight<2>(value));
+}
+// x / 255 = (x + 1 + (x >> 8)) >> 8 below 65535
+HWY_INLINE VU16 bitsOf(VU16 value, unsigned most) {
+    const auto x = hn::Add(hn::Mul(value, hn::Set(du16, static_cast<uint16_t>(most))), hn::Set(du16, 128));
+    return hn::ShiftRight<8>(hn::Add(x, hn::ShiftRight<8>(hn::Sub(x, hn::Set(du16, 1)))));
+}
+#endif
+
+void split565(const Byte* from, Byte* b, Byte* g, Byte* r, size_t n, bool green6) {
     size_t i = 0;
 #if QV_VECTORS
-    const hn::Repartition<uint32_t, D8> du32;
-    for (; i + lanes() / 4 <= n; i += lanes() / 4) {
-        const auto pixel = hn::BitCast(du32, load(from + 4 * i));
-        const auto words = hn::BitCast(du16, hn::RotateRight<16>(pixel));
-        put(hn::BitCast(d8, hn::Or(hn::ShiftLeft<8>(words), hn::ShiftRight<8>(words))), to + 4 * i);
+    for (; i + lanes() / 2 <= n; i += lanes() / 2) {
+        const auto word = hn::BitCast(du16, load(from + 2 * i));
+        const auto green = hn::And(hn::ShiftRight<5>(word), hn::Set(du16, 63));
+        putNarrow(fiveWords(word), b + i);
+        putNarrow(green6 ? hn::Or(hn::ShiftLeft<2>(green), hn::ShiftRight<4>(green)) : fiveWords(green),
+                  g + i);
+        putNarrow(fiveWords(green6 ? hn::ShiftRight<11>(word) : hn::ShiftRight<10>(word)), r + i);
     }
 #endif
     for (; i < n; ++i) {
-        const Byte pixel[4] = {from[4 * i + 3], from[4 * i + 2], from[4 * i + 1], from[4 * i]};
-        std::memcpy(to + 4 * i, pixel, 4);
+        uint16_t word;
+        std::memcpy(&word, from + 2 * i, 2);
+        b[i] = five(word);
+        g[i] = green6 ? six(word >> 5u) : five(word >> 5u);
+        r[i] = five(word >> (green6 ? 11u : 10u));
+    }
+}
+
+void join565(Byte* to, const Byte* b, const Byte* g, const Byte* r, size_t n, bool green6) {
+    size_t i = 0;
+#if QV_VECTORS
+    for (; i + lanes() / 2 <= n; i += lanes() / 2) {
+        const auto green = hn::ShiftLeft<5>(bitsOf(loadWide(g + i), green6 ? 63 : 31));
+        const auto red = bitsOf(loadWide(r + i), 31);
+        const auto upper = hn::Or(green, green6 ? hn::ShiftLeft<11>(red) : hn::ShiftLeft<10>(red));
+        put(hn::BitCast(d8, hn::Or(bitsOf(loadWide(b + i), 31), upper)), to + 2 * i);
+    }
+#endif
+    for (; i < n; ++i) {
+        const unsigned green = toBits(g[i], green6 ? 63 : 31) << 5;
+        const unsigned red = toBits(r[i], 31) << (green6 ? 11 : 10);
+        const auto word = static_cast<uint16_t>(toBits(b[i], 31) | green | red);
+        std::memcpy(to + 2 * i, &word, 2);
     }
 }
 
@@ -237,6 +283,7 @@ HWY_INLINE int rowSumOne(const int16_t m[3], int add, const Byte* bgr) {
 
 HWY_INLINE void yuvOne(const ToYuv& rows, const Byte* bgr, Byte* y, Byte* u, Byte* v) {
     *y = clampByte(rowSumOne(rows.y, rows.yAdd, bgr));
+    if (!u) return;
     *u = clampByte(rowSumOne(rows.u, rows.chromaAdd, bgr));
     *v = clampByte(rowSumOne(rows.v, rows.chromaAdd, bgr));
 }
@@ -265,11 +312,12 @@ void rgb4ToYuv(const ToYuv& rows, const Byte* from, Byte* y, Byte* u, Byte* v, s
         }
         (void)quarter;
         put(rowBytes(ry, blueRed, green), y + i);
+        if (!u) continue;
         put(rowBytes(ru, blueRed, green), u + i);
         put(rowBytes(rv, blueRed, green), v + i);
     }
 #endif
-    for (; i < n; ++i) yuvOne(rows, from + 4 * i, y + i, u + i, v + i);
+    for (; i < n; ++i) yuvOne(rows, from + 4 * i, y + i, u ? u + i : nullptr, v + i);
 }
 
 void rgbToYuv(const ToYuv& rows, const Byte* b, const Byte* g, const Byte* r, Byte* y, Byte* u, Byte* v,
@@ -286,13 +334,14 @@ void rgbToYuv(const ToYuv& rows, const Byte* b, const Byte* g, const Byte* r, By
         const V16 blueRed[4] = {lowWords(pair), highWords(pair), lowWords(pairUp), highWords(pairUp)};
         const V16 green[4] = {lowPairs(single), highPairs(single), lowPairs(singleUp), highPairs(singleUp)};
         put(rowBytes(ry, blueRed, green), y + i);
+        if (!u) continue;
         put(rowBytes(ru, blueRed, green), u + i);
         put(rowBytes(rv, blueRed, green), v + i);
     }
 #endif
     for (; i < n; ++i) {
         const Byte bgr[3] = {b[i], g[i], r[i]};
-        yuvOne(rows, bgr, y + i, u + i, v + i);
+        yuvOne(rows, bgr, y + i, u ? u + i : nullptr, v + i);
     }
 }
 
@@ -558,29 +607,6 @@ void doubleLine(Byte* to, const Byte* from, size_t n) {
     if (n & 1) to[n - 1] = samples ? from[samples - 1] : 128;
 }
 
-void quarterWay(Byte* to, const Byte* near, const Byte* far, size_t n) {
-    size_t i = 0;
-#if QV_VECTORS
-    const auto weights = hn::BitCast(di8, hn::Set(d16, 3 | 1 << 8));
-    const auto two = hn::Set(d16, 2);
-    for (; i + lanes() <= n; i += lanes()) {
-        const auto a = load(near + i), b = load(far + i);
-        const auto low = pairDotBytes(hn::InterleaveLower(d8, a, b), weights),
-                   high = pairDotBytes(hn::InterleaveUpper(d8, a, b), weights);
-        put(joinWords(hn::ShiftRight<2>(hn::Add(low, two)), hn::ShiftRight<2>(hn::Add(high, two))), to + i);
-    }
-#endif
-    for (; i < n; ++i) to[i] = static_cast<Byte>((3 * near[i] + far[i] + 2) >> 2);
-}
-
-void halfWay(Byte* to, const Byte* near, const Byte* far, size_t n) {
-    size_t i = 0;
-#if QV_VECTORS
-    for (; i + lanes() <= n; i += lanes()) put(hn::AverageRound(load(near + i), load(far + i)), to + i);
-#endif
-    for (; i < n; ++i) to[i] = static_cast<Byte>((near[i] + far[i] + 1) >> 1);
-}
-
 const char* rows8Unit() { return hwy::TargetName(HWY_TARGET); }
 
 }  // namespace HWY_NAMESPACE
@@ -602,7 +628,10 @@ QV_KERNEL(split3, (const Byte* from, Byte* a, Byte* b, Byte* c, size_t n), (from
 QV_KERNEL(join3, (Byte * to, const Byte* a, const Byte* b, const Byte* c, size_t n), (to, a, b, c, n))
 QV_KERNEL(pack4to3, (Byte * to, const Byte* from, size_t n), (to, from, n))
 QV_KERNEL(pack3to4, (Byte * to, const Byte* from, size_t n), (to, from, n))
-QV_KERNEL(reverse4, (Byte * to, const Byte* from, size_t n), (to, from, n))
+QV_KERNEL(split565, (const Byte* from, Byte* b, Byte* g, Byte* r, size_t n, bool green6),
+          (from, b, g, r, n, green6))
+QV_KERNEL(join565, (Byte * to, const Byte* b, const Byte* g, const Byte* r, size_t n, bool green6),
+          (to, b, g, r, n, green6))
 QV_KERNEL(splitYuyv, (const Byte* from, Byte* y, Byte* u, Byte* v, size_t n, bool lumaFirst),
           (from, y, u, v, n, lumaFirst))
 QV_KERNEL(joinYuyv, (Byte * to, const Byte* y, const Byte* u, const Byte* v, size_t n, bool lumaFirst),
@@ -629,8 +658,6 @@ QV_KERNEL(narrow, (Byte * to, const uint16_t* from, size_t n, bool full), (to, f
 QV_KERNEL(twice, (Byte * to, const Byte* from, size_t n), (to, from, n))
 QV_KERNEL(evens, (Byte * to, const Byte* from, size_t n), (to, from, n))
 QV_KERNEL(doubleLine, (Byte * to, const Byte* from, size_t n), (to, from, n))
-QV_KERNEL(quarterWay, (Byte * to, const Byte* near, const Byte* far, size_t n), (to, near, far, n))
-QV_KERNEL(halfWay, (Byte * to, const Byte* near, const Byte* far, size_t n), (to, near, far, n))
 
 HWY_EXPORT(rows8Unit);
 const char* rows8Unit() { return HWY_DYNAMIC_DISPATCH(rows8Unit)(); }

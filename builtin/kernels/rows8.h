@@ -21,13 +21,17 @@ void join3(Byte* to, const Byte* a, const Byte* b, const Byte* c, size_t n);
 // Drops the fourth byte of each pixel; adds one of 255.
 void pack4to3(Byte* to, const Byte* from, size_t n);
 void pack3to4(Byte* to, const Byte* from, size_t n);
-void reverse4(Byte* to, const Byte* from, size_t n);  // the bytes of each pixel
 // `n` pixels of 4:2:2, n / 2 chroma samples; a last odd pixel has U alone, which writes as the last one does.
 void splitYuyv(const Byte* from, Byte* y, Byte* u, Byte* v, size_t n, bool lumaFirst);
 void joinYuyv(Byte* to, const Byte* y, const Byte* u, const Byte* v, size_t n, bool lumaFirst);
 
+// Words with blue in the low five bits, then green in six or five, and red. Spread over 8 bits by repeating
+// their upper bits, and back to the nearest.
+void split565(const Byte* from, Byte* b, Byte* g, Byte* r, size_t n, bool green6);
+void join565(Byte* to, const Byte* b, const Byte* g, const Byte* r, size_t n, bool green6);
+
 // Between planes B, G, R or packed pixels of 3 or 4 bytes and planes of YUV in 4:4:4. The fourth byte is
-// written as 255.
+// written as 255. `u` and `v` may be null: luma alone.
 void rgbToYuv(const ToYuv& rows, const Byte* b, const Byte* g, const Byte* r, Byte* y, Byte* u, Byte* v,
               size_t n);
 void rgb4ToYuv(const ToYuv& rows, const Byte* from, Byte* y, Byte* u, Byte* v, size_t n);
@@ -49,11 +53,9 @@ void narrow(Byte* to, const uint16_t* from, size_t n, bool full);
 void twice(Byte* to, const Byte* from, size_t n);
 // Every second sample, from the first on: n of 2 * n.
 void evens(Byte* to, const Byte* from, size_t n);
-// Linear interpolation, rounded to the nearest: between chroma samples that lie on every second pixel, `n`
-// pixels from n / 2 samples (the last one goes on); between two lines, a quarter or half of the way to `far`.
+// Linear interpolation, rounded to the nearest, between chroma samples that lie on every second pixel: `n`
+// pixels from n / 2 samples; the last one goes on.
 void doubleLine(Byte* to, const Byte* from, size_t n);
-void quarterWay(Byte* to, const Byte* near, const Byte* far, size_t n);
-void halfWay(Byte* to, const Byte* near, const Byte* far, size_t n);
 
 const char* rows8Unit();  // which unit runs, as in "AVX2"
 

@@ -52,6 +52,40 @@ void halvesAcross(const Byte* from, int16_t* to, int n) {
     }
 }
 
+void quartersAcross(const Across& across, const Byte* from, int16_t* to) {
+    const int8_t* weights = across.weights.data();
+    const int n = across.target;
+    int i = 0;
+    from += across.base[0];
+#if QV_VECTORS
+    const int step = static_cast<int>(hn::Lanes(d8));
+    for (; i + step <= n; i += step) {
+        V8 near[4], far[4];
+        hn::LoadInterleaved4(d8, from + 4 * i, near[0], near[1], near[2], near[3]);
+        hn::LoadInterleaved4(d8, from + 4 * i + 4, far[0], far[1], far[2], far[3]);
+        auto low = hn::Set(d16, -bias), high = low;
+        for (int t = 0; t < 4; ++t) {
+            const int both = static_cast<Byte>(weights[t]) | static_cast<Byte>(weights[t + 4]) << 8;
+            const auto pair = hn::BitCast(di8, hn::Set(du16, static_cast<uint16_t>(both)));
+            low = hn::Add(low, pairDotBytes(hn::InterleaveLower(d8, near[t], far[t]), pair));
+            high = hn::Add(high, pairDotBytes(hn::InterleaveUpper(d8, near[t], far[t]), pair));
+        }
+#if HWY_TARGET <= HWY_AVX2
+        hn::StoreU(hn::ConcatLowerLower(d16, high, low), d16, to + i);
+        hn::StoreU(hn::ConcatUpperUpper(d16, high, low), d16, to + i + step / 2);
+#else
+        hn::StoreU(low, d16, to + i);
+        hn::StoreU(high, d16, to + i + step / 2);
+#endif
+    }
+#endif
+    for (; i < n; ++i) {
+        int sum = -bias;
+        for (int t = 0; t < 8; ++t) sum += from[4 * i + t] * weights[t];
+        to[i] = static_cast<int16_t>(sum);
+    }
+}
+
 #if !QV_VECTORS
 
 // The tables are made for vectors that pick bytes.
@@ -160,6 +194,7 @@ void scaleAcross(const Across& across, const Byte* from, int16_t* to) {
     switch (across.form) {
         case Across::copy: return copyAcross(from + across.offset, to, across.target);
         case Across::halves: return halvesAcross(from, to, across.target);
+        case Across::quarters: return quartersAcross(across, from, to);
         case Across::blocks: return blocksAcross<1>(across, from, to);
         case Across::wide: return blocksAcross<2>(across, from, to);
         case Across::runs: return runsAcross(across, from, to);

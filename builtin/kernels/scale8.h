@@ -22,7 +22,8 @@ struct Across {
     int target = 0, source = 0, taps = 1;
     enum Form : uint8_t {
         copy,
-        halves,  // every second sample with a quarter of each neighbour
+        halves,    // every second sample with a quarter of each neighbour
+        quarters,  // samples four apart, with the same eight weights each
         blocks,
         wide,  // blocks of 32 source bytes
         runs,

@@ -33,6 +33,7 @@ const Geometry geometries[] = {
     {64, 129, centred(64, 129)},   {129, 43, centred(129, 43)}, {1920, 31, centred(1920, 31)},
     {65, 65, {0.25, 1}},           {65, 65, {64, -1}},          {50, 40, {-20, 3}},
     {300, 200, centred(300, 200)}, {90, 45, centred(90, 45)},   {33, 33, {0, 1}},
+    {279, 69, {1.5, 4}},           {276, 69, {0, 4}},
 };
 
 std::vector<int16_t> across(const Across& table, Guarded& line, int64_t target) {
