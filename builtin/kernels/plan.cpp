@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cmath>
 
+#include "builtin/kernels/rgbhalves.h"
 #include "builtin/kernels/workspace.h"
 
 namespace srk {
@@ -117,6 +118,38 @@ struct Maker {
     }
 };
 
+// Weights of the pass down with a sum of halvesUnity for each line; empty: they are no whole numbers then.
+std::vector<int> halvesWeights(const Axis& down) {
+    if (down.copies || down.taps == 1) return {halvesUnity};
+    std::vector<int> weights;
+    for (const int weight : down.weights) {
+        if (weight % (unity / halvesUnity) != 0 || weight < 0) return {};
+        weights.push_back(weight / (unity / halvesUnity));
+    }
+    return weights;
+}
+
+bool readsPixels(const Format& format) {
+    using enum Packing;
+    return format.packing == bytes4 || format.packing == bytes3 || format.packing == rgb565 ||
+           format.packing == rgb555;
+}
+
+// Chroma may be filtered before the matrix: every second pixel, alone or with a quarter of its neighbours.
+void setHalves(Plan& plan) {
+    const Request& request = plan.request;
+    if (plan.deep || !plan.rgbToYuv || !readsPixels(*plan.source) || plan.target->across() != 2) return;
+    if (request.across != Mapping{} || request.width != request.sourceWidth) return;
+    for (int f = 0; f < plan.fields; ++f) {
+        Group& chroma = plan.scaling[f].chroma;
+        if (chroma.empty() || chroma.across.target == 0 || !plan.scaling[f].luma.copies()) return;
+        if (chroma.bytesAcross.form != Across::halves && chroma.spread != Group::everySecond) return;
+        chroma.halvesDown = halvesWeights(chroma.down);
+        if (chroma.halvesDown.empty()) return;
+    }
+    plan.halves = true;
+}
+
 int widest(const Plan& plan) { return std::max(plan.request.sourceWidth, plan.request.width); }
 
 void setStages(Plan& plan) {
@@ -186,6 +219,7 @@ std::shared_ptr<const Plan> makePlan(const Request& request) {
         if (plan->again)
             plan->second[f] = maker.scaling({}, {}, nullptr, plan->target, request.width, request.height, f);
     }
+    setHalves(*plan);
     return plan;
 }
 

@@ -4,204 +4,185 @@
 #include <gtest/gtest.h>
 
 #include <cmath>
-#include <memory>
-#include <string>
 
-#include "tests/builtin/kernels/guarded.h"
-#include "tests/builtin/kernels/targets.h"
+#include "builtin/kernels/rgbhalves.h"
+#include "tests/builtin/kernels/units.h"
 
 using namespace srk;
 
 namespace {
 
-// Bytes of a line for n pixels: n * times / per, rounded down.
-struct Size {
-    size_t times = 0, per = 1;
-    size_t of(size_t n) const { return n / per * times; }
-};
-constexpr Size none{}, one{1}, half{1, 2}, twoBytes{2}, three{3}, four{4};
-
-struct Lines {
-    Byte* in[4];
-    Byte* out[4];
-    size_t n;
-    const uint16_t* words(int i) const { return reinterpret_cast<const uint16_t*>(in[i]); }
-};
-
-struct Kernel {
-    const char* name;
-    Size in[4], out[4];
-    void (*run)(const Lines&);
-    bool inPlace = false;  // the first output may be the first input
-};
-
 constexpr Matrix b601 = Matrix::bt601, b709 = Matrix::bt709;
 
-const Kernel kernels[] = {
+constexpr LineSize chromaWords{8, 1, 2};
+
+void chromaOf(const LineCase& l, std::initializer_list<int> weights) {
+    const int16_t* lines[4];
+    for (int t = 0; t < 4; ++t) {
+        uint16_t* const words = l.words(t);
+        for (size_t i = 0; i < 4 * l.n; ++i) words[i] %= 1021;  // sums of four bytes
+        lines[t] = reinterpret_cast<const int16_t*>(words);
+    }
+    halvesToChroma(toYuv(b601, false), lines, weights.begin(), static_cast<int>(weights.size()), l.out[0],
+                   l.out[1], l.n);
+}
+
+const LineKernel kernels[] = {
     {"split4",
      {four},
      {one, one, one, one},
-     [](const Lines& l) { split4(l.in[0], l.out[0], l.out[1], l.out[2], l.out[3], l.n); }},
+     [](const LineCase& l) { split4(l.in[0], l.out[0], l.out[1], l.out[2], l.out[3], l.n); }},
     {"split4 of three",
      {four},
      {one, one, one},
-     [](const Lines& l) { split4(l.in[0], l.out[0], l.out[1], l.out[2], nullptr, l.n); }},
+     [](const LineCase& l) { split4(l.in[0], l.out[0], l.out[1], l.out[2], nullptr, l.n); }},
     {"join4",
      {one, one, one, one},
      {four},
-     [](const Lines& l) { join4(l.out[0], l.in[0], l.in[1], l.in[2], l.in[3], l.n); }},
+     [](const LineCase& l) { join4(l.out[0], l.in[0], l.in[1], l.in[2], l.in[3], l.n); }},
     {"join4 opaque",
      {one, one, one},
      {four},
-     [](const Lines& l) { join4(l.out[0], l.in[0], l.in[1], l.in[2], nullptr, l.n); }},
+     [](const LineCase& l) { join4(l.out[0], l.in[0], l.in[1], l.in[2], nullptr, l.n); }},
     {"split3",
      {three},
      {one, one, one},
-     [](const Lines& l) { split3(l.in[0], l.out[0], l.out[1], l.out[2], l.n); }},
+     [](const LineCase& l) { split3(l.in[0], l.out[0], l.out[1], l.out[2], l.n); }},
     {"join3",
      {one, one, one},
      {three},
-     [](const Lines& l) { join3(l.out[0], l.in[0], l.in[1], l.in[2], l.n); }},
-    {"pack4to3", {four}, {three}, [](const Lines& l) { pack4to3(l.out[0], l.in[0], l.n); }},
-    {"pack3to4", {three}, {four}, [](const Lines& l) { pack3to4(l.out[0], l.in[0], l.n); }},
+     [](const LineCase& l) { join3(l.out[0], l.in[0], l.in[1], l.in[2], l.n); }},
+    {"pack4to3", {four}, {three}, [](const LineCase& l) { pack4to3(l.out[0], l.in[0], l.n); }},
+    {"pack3to4", {three}, {four}, [](const LineCase& l) { pack3to4(l.out[0], l.in[0], l.n); }},
     {"split565",
      {twoBytes},
      {one, one, one},
-     [](const Lines& l) { split565(l.in[0], l.out[0], l.out[1], l.out[2], l.n, true); }},
+     [](const LineCase& l) { split565(l.in[0], l.out[0], l.out[1], l.out[2], l.n, true); }},
     {"split555",
      {twoBytes},
      {one, one, one},
-     [](const Lines& l) { split565(l.in[0], l.out[0], l.out[1], l.out[2], l.n, false); }},
+     [](const LineCase& l) { split565(l.in[0], l.out[0], l.out[1], l.out[2], l.n, false); }},
     {"join565",
      {one, one, one},
      {twoBytes},
-     [](const Lines& l) { join565(l.out[0], l.in[0], l.in[1], l.in[2], l.n, true); }},
+     [](const LineCase& l) { join565(l.out[0], l.in[0], l.in[1], l.in[2], l.n, true); }},
     {"join555",
      {one, one, one},
      {twoBytes},
-     [](const Lines& l) { join565(l.out[0], l.in[0], l.in[1], l.in[2], l.n, false); }},
+     [](const LineCase& l) { join565(l.out[0], l.in[0], l.in[1], l.in[2], l.n, false); }},
     {"luma alone",
      {one, one, one},
      {one},
-     [](const Lines& l) {
+     [](const LineCase& l) {
          rgbToYuv(toYuv(b601, false), l.in[0], l.in[1], l.in[2], l.out[0], nullptr, nullptr, l.n);
      }},
     {"split YUYV",
      {twoBytes},
      {one, half, half},
-     [](const Lines& l) { splitYuyv(l.in[0], l.out[0], l.out[1], l.out[2], l.n, true); }},
+     [](const LineCase& l) { splitYuyv(l.in[0], l.out[0], l.out[1], l.out[2], l.n, true); }},
     {"split UYVY",
      {twoBytes},
      {one, half, half},
-     [](const Lines& l) { splitYuyv(l.in[0], l.out[0], l.out[1], l.out[2], l.n, false); }},
+     [](const LineCase& l) { splitYuyv(l.in[0], l.out[0], l.out[1], l.out[2], l.n, false); }},
     {"join YUYV",
      {one, half, half},
      {twoBytes},
-     [](const Lines& l) { joinYuyv(l.out[0], l.in[0], l.in[1], l.in[2], l.n, true); }},
+     [](const LineCase& l) { joinYuyv(l.out[0], l.in[0], l.in[1], l.in[2], l.n, true); }},
     {"join UYVY",
      {one, half, half},
      {twoBytes},
-     [](const Lines& l) { joinYuyv(l.out[0], l.in[0], l.in[1], l.in[2], l.n, false); }},
+     [](const LineCase& l) { joinYuyv(l.out[0], l.in[0], l.in[1], l.in[2], l.n, false); }},
     {"rgb4ToYuv",
      {four},
      {one, one, one},
-     [](const Lines& l) { rgb4ToYuv(toYuv(b601, false), l.in[0], l.out[0], l.out[1], l.out[2], l.n); }},
+     [](const LineCase& l) { rgb4ToYuv(toYuv(b601, false), l.in[0], l.out[0], l.out[1], l.out[2], l.n); }},
     {"rgb4ToYuv video",
      {four},
      {one, one, one},
-     [](const Lines& l) { rgb4ToYuv(toYuv(b709, true), l.in[0], l.out[0], l.out[1], l.out[2], l.n); }},
+     [](const LineCase& l) { rgb4ToYuv(toYuv(b709, true), l.in[0], l.out[0], l.out[1], l.out[2], l.n); }},
     {"rgbToYuv",
      {one, one, one},
      {one, one, one},
-     [](const Lines& l) {
+     [](const LineCase& l) {
          rgbToYuv(toYuv(b709, false), l.in[0], l.in[1], l.in[2], l.out[0], l.out[1], l.out[2], l.n);
      },
      true},
     {"yuvToRgb",
      {one, one, one},
      {one, one, one},
-     [](const Lines& l) {
+     [](const LineCase& l) {
          yuvToRgb(toRgb(b601, false), l.in[0], l.in[1], l.in[2], l.out[0], l.out[1], l.out[2], l.n);
      },
      true},
     {"yuvToRgb4",
      {one, one, one},
      {four},
-     [](const Lines& l) { yuvToRgb4(toRgb(b709, false), l.in[0], l.in[1], l.in[2], l.out[0], l.n); }},
+     [](const LineCase& l) { yuvToRgb4(toRgb(b709, false), l.in[0], l.in[1], l.in[2], l.out[0], l.n); }},
     {"yuvToRgb3 video",
      {one, one, one},
      {three},
-     [](const Lines& l) { yuvToRgb3(toRgb(b709, true), l.in[0], l.in[1], l.in[2], l.out[0], l.n); }},
+     [](const LineCase& l) { yuvToRgb3(toRgb(b709, true), l.in[0], l.in[1], l.in[2], l.out[0], l.n); }},
     {"yuvToOther",
      {one, one, one},
      {one, one, one},
-     [](const Lines& l) {
+     [](const LineCase& l) {
          for (int i = 0; i < 3; ++i) std::memmove(l.out[i], l.in[i], l.n);
          yuvToOther(toOther(b709), l.out[0], l.out[1], l.out[2], l.n);
      }},
-    {"toVideoLevels", {one}, {one}, [](const Lines& l) { toVideoLevels(l.out[0], l.in[0], l.n); }, true},
-    {"toFullLevels", {one}, {one}, [](const Lines& l) { toFullLevels(l.out[0], l.in[0], l.n); }, true},
+    {"toVideoLevels", {one}, {one}, [](const LineCase& l) { toVideoLevels(l.out[0], l.in[0], l.n); }, true},
+    {"toFullLevels", {one}, {one}, [](const LineCase& l) { toFullLevels(l.out[0], l.in[0], l.n); }, true},
     {"widen",
      {one},
      {twoBytes},
-     [](const Lines& l) { widen(reinterpret_cast<uint16_t*>(l.out[0]), l.in[0], l.n, false); }},
+     [](const LineCase& l) { widen(reinterpret_cast<uint16_t*>(l.out[0]), l.in[0], l.n, false); }},
     {"widen full",
      {one},
      {twoBytes},
-     [](const Lines& l) { widen(reinterpret_cast<uint16_t*>(l.out[0]), l.in[0], l.n, true); }},
-    {"narrow", {twoBytes}, {one}, [](const Lines& l) { narrow(l.out[0], l.words(0), l.n, false); }},
-    {"narrow full", {twoBytes}, {one}, [](const Lines& l) { narrow(l.out[0], l.words(0), l.n, true); }},
-    {"twice", {one}, {twoBytes}, [](const Lines& l) { twice(l.out[0], l.in[0], l.n); }},
-    {"evens", {twoBytes}, {one}, [](const Lines& l) { evens(l.out[0], l.in[0], l.n); }},
-    {"doubleLine", {half}, {one}, [](const Lines& l) { doubleLine(l.out[0], l.in[0], l.n); }},
+     [](const LineCase& l) { widen(reinterpret_cast<uint16_t*>(l.out[0]), l.in[0], l.n, true); }},
+    {"narrow", {twoBytes}, {one}, [](const LineCase& l) { narrow(l.out[0], l.words(0), l.n, false); }},
+    {"narrow full", {twoBytes}, {one}, [](const LineCase& l) { narrow(l.out[0], l.words(0), l.n, true); }},
+    {"twice", {one}, {twoBytes}, [](const LineCase& l) { twice(l.out[0], l.in[0], l.n); }},
+    {"evens", {twoBytes}, {one}, [](const LineCase& l) { evens(l.out[0], l.in[0], l.n); }},
+    {"doubleLine", {half}, {one}, [](const LineCase& l) { doubleLine(l.out[0], l.in[0], l.n); }},
+    {"rgb4ToLuma",
+     {four},
+     {one},
+     [](const LineCase& l) { rgb4ToLuma(toYuv(b709, false), l.in[0], l.out[0], l.n); }},
+    {"rgb4Halves",
+     {four},
+     {{8, 2, 2}},
+     [](const LineCase& l) { rgb4Halves(l.in[0], reinterpret_cast<int16_t*>(l.out[0]), l.n, true); }},
+    {"rgb4Halves of single pixels",
+     {four},
+     {{8, 2, 2}},
+     [](const LineCase& l) { rgb4Halves(l.in[0], reinterpret_cast<int16_t*>(l.out[0]), l.n, false); }},
+    {"halvesToChroma, symmetric",
+     {chromaWords, chromaWords, chromaWords, chromaWords},
+     {one, one},
+     [](const LineCase& l) {
+         chromaOf(l, {2, 6, 6, 2});
+     }},
+    {"halvesToChroma",
+     {chromaWords, chromaWords, chromaWords, chromaWords},
+     {one, one},
+     [](const LineCase& l) {
+         chromaOf(l, {1, 5, 7, 3});
+     }},
+    {"halvesToChroma of a line",
+     {chromaWords, chromaWords, chromaWords, chromaWords},
+     {one, one},
+     [](const LineCase& l) { chromaOf(l, {halvesUnity}); }},
 };
-
-constexpr size_t longest = 129;
-
-std::string bytesOf(Byte* from, size_t n) { return {reinterpret_cast<const char*>(from), n}; }
-
-// What a kernel makes of lines that end at the edge of their memory, on one unit.
-std::string run(const Kernel& kernel, size_t n, bool inPlace, int64_t target) {
-    std::unique_ptr<Guarded> in[4], out[4];
-    Lines lines{{}, {}, n};
-    for (unsigned i = 0; i < 4; ++i) {
-        in[i] = std::make_unique<Guarded>(kernel.in[i].of(n), i + static_cast<unsigned>(n));
-        out[i] = std::make_unique<Guarded>(kernel.out[i].of(n), 77 + i);
-        lines.in[i] = in[i]->data();
-        lines.out[i] = inPlace ? in[i]->data() : out[i]->data();
-    }
-    const OnTarget only(target);
-    kernel.run(lines);
-    std::string result;
-    for (int i = 0; i < 4; ++i) {
-        result += bytesOf(lines.out[i], kernel.out[i].of(n));
-        if (!inPlace) result += bytesOf(lines.in[i], kernel.in[i].of(n));
-        if (!in[i]->frontIntact() || !out[i]->frontIntact()) result += "written before the line";
-    }
-    return result;
-}
 
 }  // namespace
 
-TEST(Rows8, UnitsGiveTheBytesOfThePlainLoops) {
-    const auto targets = machineTargets();
-    for (const auto& kernel : kernels)
-        for (size_t n = 1; n <= longest; ++n)
-            for (const bool inPlace : {false, true}) {
-                if (inPlace && !kernel.inPlace) continue;
-                const std::string expected = run(kernel, n, inPlace, HWY_STATIC_TARGET);
-                EXPECT_EQ(expected.find("written before"), std::string::npos);
-                for (const auto target : targets)
-                    ASSERT_TRUE(run(kernel, n, inPlace, target) == expected)
-                        << kernel.name << ' ' << n << (inPlace ? " in place on " : " on ")
-                        << hwy::TargetName(target);
-            }
-}
+TEST(Rows8, UnitsGiveTheBytesOfThePlainLoops) { compareUnits(kernels); }
 
 TEST(Rows8, UnitsOfTheMachineReallyRun) {
     for (const auto target : machineTargets()) {
         const OnTarget only(target);
         EXPECT_STREQ(rows8Unit(), hwy::TargetName(target));
+        EXPECT_STREQ(rgbHalvesUnit(), hwy::TargetName(target));
     }
 }
 

@@ -5,19 +5,16 @@
 
 #include <vector>
 
-// While it lives, kernels run on this unit alone.
+// While it lives, kernels run on this unit alone. The machine is asked once what it has: that takes long.
 class OnTarget {
   public:
-    explicit OnTarget(int64_t target) { choose(target); }
-    ~OnTarget() { choose(0); }
+    explicit OnTarget(int64_t target) { hwy::GetChosenTarget().Update(target); }
+    ~OnTarget() {
+        static const int64_t all = hwy::SupportedTargets();
+        hwy::GetChosenTarget().Update(all);
+    }
     OnTarget(const OnTarget&) = delete;
     OnTarget& operator=(const OnTarget&) = delete;
-
-  private:
-    static void choose(int64_t target) {
-        hwy::SetSupportedTargetsForTest(target);
-        hwy::GetChosenTarget().Update(hwy::SupportedTargets());
-    }
 };
 
 // The units that this machine has and the kernels are compiled for, plain loops among them.
