@@ -421,7 +421,7 @@ namespace srk {
 
 #define QV_KERNEL(name, parameters, arguments) \
     HWY_EXPORT(name);                          \
-    void name parameters { HWY_DYNAMIC_DISPATCH(name) arguments; }
+    void name parameters { HWY_DYNAMIC_DISPATCH(name) arguments; }  // NOLINT(bugprone-macro-parentheses)
 
 QV_KERNEL(splitWords4, (const Byte* from, uint16_t* a, uint16_t* b, uint16_t* c, uint16_t* d, size_t n),
           (from, a, b, c, d, n))
