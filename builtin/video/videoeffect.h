@@ -15,6 +15,7 @@
 #include "core/engine/params.h"
 #include "core/filter/qvfilter.h"
 #include "core/media/qvframe.h"
+#include "core/media/qvgeometry.h"
 
 // Lifecycle and hand-over of an effect with one output frame.
 class VideoEffect : public QvVideoFilter {

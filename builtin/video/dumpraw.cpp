@@ -1,0 +1,67 @@
+#include "builtin/video/dumpraw.h"
+
+#include "builtin/creators.h"
+#include "core/arch/platform.h"
+#include "core/engine/qvlog.h"
+#include "core/media/qvgeometry.h"
+
+namespace {
+
+constexpr QvParamRow<DumpRawSettings> rows[] = {
+    {.name = "filename",
+     .member = &DumpRawSettings::filename,
+     .flags = qvParamStored,
+     .description = "Raw filename"},
+};
+static_assert(qvParamTableOk<DumpRawSettings>(rows));
+
+}  // namespace
+
+QvCodec* newRawdump() { return new DumpRaw; }
+
+DumpRaw::DumpRaw() : InPlaceEffectOf("rawdump", rows) {}
+
+int DumpRaw::open() {
+    const std::string& name = settings_.filename;
+    file_.reset();
+    failed_ = false;
+    if (name != DumpRawSettings().filename) file_.reset(qv_platform().openFile(name.c_str(), "wb"));
+    if (file_) return InPlaceEffectOf::open();
+    qv_dbg()->error("Raw dumper, failed to open %s, exiting.", name.c_str());
+    return setError(QvStatus::failed, "the file %s of the raw dump can't be written", name.c_str());
+}
+
+int DumpRaw::close() {
+    if (file_ && std::fclose(file_.release()) != 0) writeFailed();
+    const int result = InPlaceEffectOf::close();
+    return failed_ ? QvStatus::failed : result;
+}
+
+int DumpRaw::writeFailed() {
+    file_.reset();
+    failed_ = true;
+    qv_log()->error("[rawdump] fail to write to %s.", settings_.filename.c_str());
+    return setError(QvStatus::failed, "fail to write to %s", settings_.filename.c_str());
+}
+
+int DumpRaw::append(const QvFrame& frame) {
+    if (!file_) return QvStatus::ok;
+    const auto bytes = static_cast<size_t>(frame.total_bytes());
+    if (bytes == 0 || std::fwrite(frame.plane(), 1, bytes, file_.get()) == bytes) return QvStatus::ok;
+    return writeFailed();
+}
+
+int DumpRaw::change(const QvFrame& from, QvFrame& to) {
+    copySamples(to, from);
+    return QvStatus::ok;
+}
+
+int DumpRaw::write(QvFrame& frame) {
+    if (const int result = InPlaceEffectOf::write(frame)) return result;
+    return append(frame);
+}
+
+int DumpRaw::apply(QvFrame& frame) {
+    if (const int result = InPlaceEffectOf::apply(frame)) return result;
+    return append(frame);
+}

@@ -1,0 +1,83 @@
+// How samples stand in the rows of each pixel format, for effects that work sample by sample whatever the
+// format, and weighted sums of rows with what is laid over them.
+#pragma once
+
+#include <array>
+#include <cstddef>
+#include <cstdint>
+#include <vector>
+
+#include "core/media/qvframe.h"
+
+enum class SampleRole : uint8_t {
+    colour,  // of RGB: black is 0, white all ones
+    video,   // of RGB from 16 to 235, in steps of 8 bits
+    luma,    // 16 to 235
+    chroma,  // 16 to 240, no colour is 128
+    keep     // alpha, or unused: no effect changes it
+};
+
+struct SampleLayout {
+    // Formats that pack several samples into a word are taken apart into words.
+    enum Store : uint8_t { bytes, words, v210, r565, r555 };
+
+    unsigned fourcc;
+    Store store;
+    uint8_t bits;                      // of a sample
+    uint8_t perPixel;                  // samples of plane 0 for each pixel
+    std::array<SampleRole, 4> first4;  // of a row of plane 0; it goes on in this way. Other planes are chroma
+
+    SampleRole role(int plane, size_t sample) const {
+        return plane ? SampleRole::chroma : first4[sample & 3];
+    }
+    uint32_t black(SampleRole role) const;
+    uint32_t white(SampleRole role) const;
+    // Whether rows are weighed as words; otherwise as bytes.
+    bool wide() const { return store != bytes; }
+    // Samples in the first `pixels` pixels of plane 0, or in as many of another plane.
+    size_t samples(int plane, int pixels) const {
+        return static_cast<size_t>(pixels) * (plane ? 1u : perPixel);
+    }
+    // In a whole row of a frame; of v210 in whole groups of six pixels.
+    size_t rowSamples(const QvFrame& frame, int plane) const;
+    // Of a pixel that begins a byte, and of v210 a group of six.
+    std::ptrdiff_t byteOffset(int plane, int pixel) const;
+    // A bit for each of the first four samples of plane 0 that has this role.
+    unsigned chosen(SampleRole role) const;
+};
+
+// Of any format that a frame can have.
+const SampleLayout& sampleLayout(unsigned fourcc);
+
+// All rows of a plane, of I422 also the lower half of the chroma.
+int sampleRows(const QvFrame& frame, int plane);
+
+// Gives `out` the format and size of `like` and leaves what it holds open. 0, or -3 with `out` empty.
+int takeShape(QvFrame& out, const QvFrame& like);
+
+// All samples of a frame of the same format and size; QvFrame's own copy leaves half of the chroma of I422.
+// From plane `first` on; nothing if both are one frame.
+void copySamples(QvFrame& to, const QvFrame& from, int first = 0);
+
+// What becomes of each sample of a row: sample * scale + add. Made for one layout.
+class SampleWeights {
+  public:
+    void resize(const SampleLayout& layout, size_t samples);
+    // Sample i becomes `share` / 65536 of itself and the rest of `level`.
+    void fade(size_t i, uint32_t level, uint32_t share);
+    // Sample i becomes (1 - weight / 65536) of itself, above `black`, and all of `laid`, which holds the
+    // picture laid over it as it looks over black.
+    void cover(size_t i, uint32_t laid, uint32_t black, uint32_t weight);
+    // Applies weights `first` and following to a row; `to` may be `from`.
+    void apply(unsigned char* to, const unsigned char* from, size_t first, size_t samples);
+
+  private:
+    const SampleLayout* layout_ = nullptr;
+    std::vector<uint16_t> scale8_, add8_;
+    std::vector<uint32_t> scale16_, add16_;
+    std::vector<uint16_t> apart_;  // a row of packed samples
+};
+
+// A row of packed samples as words, and back; whole pixels, of v210 whole groups of six.
+void takeApart(const SampleLayout& layout, const unsigned char* from, uint16_t* words, size_t samples);
+void putTogether(const SampleLayout& layout, const uint16_t* words, unsigned char* to, size_t samples);

@@ -1,0 +1,66 @@
+// What the tests of video effects share.
+#pragma once
+
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <cstring>
+#include <initializer_list>
+#include <memory>
+#include <string>
+#include <utility>
+
+#include "core/media/qvframe.h"
+#include "core/value/any.h"
+#include "tests/support/pictures.h"
+
+// An effect with parameters, opened.
+template <class Effect>
+struct OpenedEffect : Effect {
+    OpenedEffect(std::initializer_list<std::pair<const char*, Any>> params = {}) {
+        this->init();
+        for (const auto& [name, value] : params) EXPECT_EQ(this->setParam(name, value), 0) << name;
+        EXPECT_EQ(this->open(), 0) << this->errorDesc();
+    }
+    // The frame that comes out, or an empty one.
+    const QvFrame& through(QvFrame& frame) {
+        static const QvFrame nothing;
+        EXPECT_EQ(this->write(frame), 0) << this->errorDesc();
+        return this->ready() ? *this->frame() : nothing;
+    }
+};
+
+inline std::string fourccName(unsigned fourcc) { return qvFourccText(fourcc).data(); }
+
+inline int planeRows(const QvFrame& frame, int plane) {
+    return frame.plane_bytes(plane) / frame.stride(plane);
+}
+
+inline const unsigned char* rowOf(const QvFrame& frame, int plane, int y) {
+    return frame.plane(plane) + static_cast<std::ptrdiff_t>(frame.stride(plane)) * y;
+}
+
+// The bytes of a picture, without those that only pad rows.
+inline std::string samplesOf(const QvFrame& frame) {
+    std::string all;
+    for (int p = 0; p < frame.planes(); ++p) {
+        const int bytes =
+            frame.pixelBytes(p) > 0 ? frame.width(p) * frame.pixelBytes(p) : (frame.width() + 5) / 6 * 16;
+        for (int y = 0; y < planeRows(frame, p); ++y)
+            all.append(reinterpret_cast<const char*>(rowOf(frame, p, y)), static_cast<size_t>(bytes));
+    }
+    return all;
+}
+
+// What an effect makes of a copy in place is what it makes of the frame that it is given.
+template <class Effect>
+void sameInPlace(Effect&& written, Effect&& applied, const QvFrame& frame) {
+    QvFrame in = makePicture(frame.four_cc(), frame.width(), frame.height(), 7), copy;
+    std::memcpy(in.plane(), frame.plane(), static_cast<size_t>(in.total_bytes()));
+    copy = in;
+    std::memcpy(copy.plane(), in.plane(), static_cast<size_t>(in.total_bytes()));
+    const QvFrame& out = written.through(in);
+    EXPECT_TRUE(applied.applySupported());
+    EXPECT_EQ(applied.apply(copy), 0);
+    EXPECT_TRUE(samplesOf(out) == samplesOf(copy)) << frame.str_four_cc();
+}
