@@ -2,7 +2,6 @@
 
 #include <gtest/gtest.h>
 
-#include <cstring>
 #include <string>
 #include <vector>
 
@@ -22,12 +21,6 @@ std::string hex(const QvCcData& data) {
     return text;
 }
 
-std::string times(std::string_view pair, int count) {
-    std::string text;
-    for (int i = 0; i < count; ++i) text += " " + std::string(pair);
-    return text;
-}
-
 // Pairs of these types, one a tick from 0 on, numbered in byte 2.
 QvCcData listOf(const std::vector<int>& types) {
     QvCcData data;
@@ -37,28 +30,40 @@ QvCcData listOf(const std::vector<int>& types) {
 }
 
 TEST(QvCcBytePair, HeaderAndStoredForm) {
-    QvCcBytePair pair(0, 0x94, 0x2C, false);
+    QvCcBytePair pair(0, 0x94, 0x2C, false), null(1, 1, 2, false);
     EXPECT_EQ(pair.header, 0xF8);
-    EXPECT_TRUE(pair.isFiller());
     pair.setValid(true);
+    EXPECT_EQ(pair.header, 0xFC);
     pair.setType(3);
-    EXPECT_EQ(pair.header, 0xFF);
-    pair.invalidToNull();
+    for (QvCcBytePair* changed : {&pair, &null}) changed->invalidToNull();
     EXPECT_EQ(pair, QvCcBytePair(3, 0x94, 0x2C, true));
-    QvCcBytePair null(1, 1, 2, false);
-    null.invalidToNull();
     EXPECT_EQ(null, QvCcBytePair(1, 0x80, 0x80, true));
     EXPECT_EQ(QvCcBytePair(MediaTime(3, 2), 0, 0, 0, true).time, MediaTime(1.5));
-
     AnyDict dict;
     QvCcBytePair(MediaTime(7), 2, 0xAB, 0xCD, true).store(dict);
-    EXPECT_EQ(dict.getInt32("d"), 0xFEABCD);
+    EXPECT_EQ(dict, AnyDict("d", 0xFEABCD, "t", MediaTime(7)));
     EXPECT_EQ(pair.restore(dict), 0);
-    EXPECT_EQ(pair, QvCcBytePair(MediaTime(7), 2, 0xAB, 0xCD, true));
     for (const auto& broken : {AnyDict("d", 1), AnyDict("t", MediaTime(1)),
                                AnyDict("d", 1LL, "t", MediaTime(1)), AnyDict("d", 1, "t", 1)})
         EXPECT_EQ(pair.restore(broken), -1);
-    EXPECT_EQ(pair.time, MediaTime(7));
+    EXPECT_EQ(pair, QvCcBytePair(MediaTime(7), 2, 0xAB, 0xCD, true));
+}
+
+struct Query {
+    int mask = -1, start = -99, end = -99, from = -1, to = -1, valid = -1, most = -1;  // these are no test
+    bool stop = true;
+};
+
+std::string found(const QvCcData& data, const Query& q) {
+    const MediaTime from(q.from), to(q.to);
+    const bool valid = q.valid == 1;
+    std::string indexes;
+    for (const Any& index :
+         data.find(q.mask < 0 ? nullptr : &q.mask, q.start == -99 ? nullptr : &q.start,
+                   q.end == -99 ? nullptr : &q.end, q.from < 0 ? nullptr : &from, q.to < 0 ? nullptr : &to,
+                   q.valid < 0 ? nullptr : &valid, q.stop, q.most < 0 ? nullptr : &q.most))
+        indexes += std::to_string(index.asInt32());
+    return indexes;
 }
 
 TEST(QvCcData, FindsByTypeTimeAndPlace) {
@@ -66,34 +71,18 @@ TEST(QvCcData, FindsByTypeTimeAndPlace) {
     data.at(4).setValid(false);
     data.at(1).time = MediaTime(50);
     EXPECT_FALSE(data.isSorted());
-    const int mask0 = 1, mask708 = 12, two = 2, none = 0, far = 99, back = -1, four = 4;
-    const MediaTime t2(2), t4(4);
-    const bool valid = true;
-    const struct {
-        const int *mask, *start, *end;
-        const MediaTime *from, *to;
-        const bool* valid;
-        bool stop;
-        const int* most;
-        AnyVector expected;
-    } rows[] = {
-        {nullptr, nullptr, nullptr, nullptr, nullptr, nullptr, true, nullptr, {0, 1, 2, 3, 4, 5, 6}},
-        {&mask0, nullptr, nullptr, nullptr, nullptr, nullptr, true, nullptr, {0, 4, 6}},
-        {&mask0, nullptr, nullptr, nullptr, nullptr, &valid, true, nullptr, {0, 6}},
-        {&mask708, nullptr, nullptr, nullptr, nullptr, nullptr, true, nullptr, {2, 3}},
-        {nullptr, nullptr, nullptr, &t2, &t4, nullptr, false, nullptr, {2, 3, 4}},
-        {nullptr, &far, &back, nullptr, nullptr, nullptr, true, nullptr, AnyVector(Any(6))},
-        {nullptr, &back, &two, nullptr, nullptr, nullptr, true, nullptr, {0, 1, 2}},
-        {nullptr, &two, &four, nullptr, nullptr, nullptr, true, &two, {2, 3}},
-        {nullptr, nullptr, nullptr, nullptr, nullptr, nullptr, true, &none, {}},
-        {nullptr, nullptr, nullptr, nullptr, &t4, nullptr, true, nullptr, AnyVector(Any(0))},
-        {&mask708, nullptr, nullptr, nullptr, &t4, nullptr, true, nullptr, {}},  // stopped by another type
-        {nullptr, nullptr, nullptr, nullptr, &t4, nullptr, false, nullptr, {0, 2, 3, 4}},
-    };
-    for (const auto& r : rows)
-        EXPECT_EQ(data.find(r.mask, r.start, r.end, r.from, r.to, r.valid, r.stop, r.most), r.expected)
-            << &r - rows;
-    EXPECT_TRUE(QvCcData().find(nullptr, &two, &four, nullptr, nullptr, nullptr, true, nullptr).empty());
+    EXPECT_EQ(found(data, {}), "0123456");
+    EXPECT_EQ(found(data, {.mask = 1}), "046");
+    EXPECT_EQ(found(data, {.mask = 1, .valid = 1}), "06");
+    EXPECT_EQ(found(data, {.mask = 12}), "23");
+    EXPECT_EQ(found(data, {.start = 99, .end = -1}), "6");
+    EXPECT_EQ(found(data, {.start = -1, .end = 2}), "012");
+    EXPECT_EQ(found(data, {.start = 2, .end = 4, .most = 2}), "23");
+    EXPECT_EQ(found(data, {.most = 0}), "");
+    EXPECT_EQ(found(data, {.to = 4}), "0");
+    EXPECT_EQ(found(data, {.mask = 12, .to = 4}), "") << "stopped by another type";
+    EXPECT_EQ(found(data, {.from = 2, .to = 4, .stop = false}), "234");
+    EXPECT_EQ(found(QvCcData(), {.start = 2, .end = 4}), "");
 }
 
 TEST(QvCcData, ChangesKeepTheOrderOfTheRest) {
@@ -116,6 +105,8 @@ TEST(QvCcData, ChangesKeepTheOrderOfTheRest) {
     data.appendFillers(1, 3, true, MediaTime(6));
     data.appendFillers(2, 0, true, MediaTime(7));
     EXPECT_EQ(hex(data), "fc8080 f90000 fe0000 ff0000 fc8080 fc8080");
+    EXPECT_EQ(data.dbgDump(nullptr),
+              "cnt=6, process=1, 2 fillers, 708-d 0.000000 0000, 708-s 0.000000 0000, 2 fillers");
     EXPECT_EQ(data.removeFillers(MediaTime(6)), 2);
     EXPECT_EQ(hex(data), "fe0000 ff0000 fc8080 fc8080");
     data.setTime(MediaTime(1), -5, 1);
@@ -125,19 +116,15 @@ TEST(QvCcData, ChangesKeepTheOrderOfTheRest) {
     EXPECT_EQ(data.maxTime(true), MediaTime(6));
     EXPECT_EQ(QvCcData().maxTime(), MediaTime());
     EXPECT_THROW(data.at(4), QvAssertFailure);
-    EXPECT_EQ(listOf({0, 0, 2}).dbgDump(nullptr),
-              "cnt=3, process=1, 608-1 0.000000 2000, 608-1 0.000000 2001, 708-d 0.000000 2002");
 }
 
 TEST(QvCcData, StoredFormReadsBackOrIsRefusedWhole) {
-    QvCcData data = listOf({0, 1, 2, 3});
+    QvCcData data = listOf({0, 1, 2, 3}), back;
     data.setProcessCCDataFlag(false);
     AnyDict dict;
     data.store(dict);
     EXPECT_EQ(dict["name"], "cc_data");
-    QvCcData back;
     ASSERT_EQ(back.restore(dict), 0);
-    EXPECT_EQ(back, data);
     AnyDict other = dict, broken = dict;
     other.set("name", "text");
     broken["data"].asVector().append(1);
@@ -147,47 +134,42 @@ TEST(QvCcData, StoredFormReadsBackOrIsRefusedWhole) {
 }
 
 TEST(QvCcData, BuffersOfEachFormat) {
+    const std::string body("\xC2\xFF\xFC\x94\x20\xFA\x00\x00", 8), country("\xB5\x00\x31", 3);
     const struct {
         int fmt;
         std::string bytes;
-    } rows[] = {
-        {0, std::string("\xC2\xFF\xFC\x94\x20\xFA\x00\x00", 8)},
-        {3, std::string("GA94\x03\xC2\xFF\xFC\x94\x20\xFA\x00\x00\xFF", 14)},
-        {5, std::string("\xB5\x00\x31GA94\x03\xC2\xFF\xFC\x94\x20\xFA\x00\x00\xFF", 17)},
-    };
-    QvCcData data;
+    } rows[] = {{0, body}, {3, "GA94\x03" + body + "\xFF"}, {5, country + "GA94\x03" + body + "\xFF"}};
+    QvCcData data, back;
     data.append(QvCcBytePair(0, 0x94, 0x20, true));
     data.appendFillers(1, 2, false, MediaTime());
+    const MediaTime t(42);
+    std::string buffer(104, 'x');
+    auto* bytes = reinterpret_cast<unsigned char*>(buffer.data());
     for (const auto& row : rows) {
-        std::string buffer(120, 'x');
-        auto* bytes = reinterpret_cast<unsigned char*>(buffer.data());
         const int size = static_cast<int>(row.bytes.size());
         EXPECT_EQ(data.byteSize(row.fmt), size);
+        buffer.assign(104, 'x');
         EXPECT_EQ(data.toBuffer(row.fmt, size - 1, bytes), -18);
-        EXPECT_EQ(data.toBuffer(row.fmt, 120, bytes), size);
+        EXPECT_EQ(data.toBuffer(row.fmt, 104, bytes), size);
         EXPECT_EQ(buffer, row.bytes + std::string(buffer.size() - row.bytes.size(), 'x'));
         EXPECT_EQ(QvCcData::detectBufferFmt(size, bytes), row.fmt == 0 ? -1 : row.fmt);
-        QvCcData back;
-        const MediaTime t(42);
+        EXPECT_EQ(QvCcData::detectBufferFmt(6, bytes), -1);
         for (int cut = 0; cut < size - (row.fmt ? 1 : 0); ++cut)  // the last marker is not needed
             EXPECT_EQ(back.fromBuffer(row.fmt, cut, bytes, &t), -18) << row.fmt << " " << cut;
         ASSERT_EQ(back.fromBuffer(row.fmt, size, bytes, &t), 0);
         EXPECT_EQ(hex(back), "fc9420 fa0000");
         EXPECT_EQ(back.at(1).time, t);
     }
-    const auto* head = reinterpret_cast<const unsigned char*>("GA94\x03\x80\xFF");
-    EXPECT_EQ(QvCcData::detectBufferFmt(7, head), 3);
-    EXPECT_EQ(QvCcData::detectBufferFmt(6, head), -1);
+    EXPECT_EQ(QvCcData::detectBufferFmt(7, bytes + 3), 3);
     EXPECT_EQ(data.byteSize(4), -12);
-    EXPECT_EQ(data.fromBuffer(4, 7, head, nullptr), -12);
+    EXPECT_EQ(data.fromBuffer(4, 7, bytes, nullptr), -12);
     data.appendFillers(29, 2, false, MediaTime());
-    unsigned char full[104];
-    EXPECT_EQ(data.toBuffer(5, 104, full), 104);
-    EXPECT_EQ(data.fromBuffer(5, 104, full, nullptr), 0);
+    EXPECT_EQ(data.toBuffer(5, 104, bytes), 104);
+    EXPECT_EQ(data.fromBuffer(5, 104, bytes, nullptr), 0);
     EXPECT_EQ(data.count(), 31);
     data.appendFillers(1, 2, false, MediaTime());
-    EXPECT_EQ(data.toBuffer(5, 104, full), -18);
-    EXPECT_EQ(data.fromBuffer(0, 96, full, nullptr), -18);
+    EXPECT_EQ(data.toBuffer(5, 104, bytes), -18);
+    EXPECT_EQ(data.fromBuffer(0, 96, bytes, nullptr), -18);
 }
 
 // The 608 slots of four frames, then the number of slots, for every rate.
@@ -199,47 +181,46 @@ TEST(QvCcProcessor, ScheduleOfEachRate) {
         const char* types;
         int slots;
     } rows[] = {
-        {Rate::f29p(), "01 01 01 01", 20},   {Rate::f30p(), "01 01 01 01", 20},
-        {Rate::f59i(), "01 01 01 01", 20},   {Rate::f60i(), "01 01 01 01", 20},
-        {bottom59, "10 10 10 10", 20},       {bottom60, "10 10 10 10", 20},
-        {Rate::f60p(), "0 1 0 1", 10},       {Rate::f59p(), "0 1 0 1", 10},
-        {Rate::f23p(), "01 010 10 101", 25}, {Rate::f24p(), "01 010 10 101", 25},
+        {Rate::f29p(), "01 01 01 01 ", 20},   {Rate::f30p(), "01 01 01 01 ", 20},
+        {Rate::f59i(), "01 01 01 01 ", 20},   {Rate::f60i(), "01 01 01 01 ", 20},
+        {bottom59, "10 10 10 10 ", 20},       {bottom60, "10 10 10 10 ", 20},
+        {Rate::f60p(), "0 1 0 1 ", 10},       {Rate::f59p(), "0 1 0 1 ", 10},
+        {Rate::f23p(), "01 010 10 101 ", 25}, {Rate::f24p(), "01 010 10 101 ", 25},
+        {Rate::f25p(), nullptr, 0},           {Rate::f50i(), nullptr, 0},
     };
     for (const auto& row : rows) {
         QvCcProcessor queue;
+        QvCcData out;
         queue.start(true, true, row.rate, 0);
+        if (!row.types) {
+            EXPECT_THROW(queue.get(out, MediaTime()), QvAssertFailure);
+            continue;
+        }
         std::string types;
-        for (int frame = 0; frame < 4; ++frame) {
-            QvCcData out;
+        for (int frame = 0; frame < 4; ++frame, types += ' ') {
             ASSERT_EQ(queue.get(out, MediaTime()), 0);
             EXPECT_EQ(out.count(), row.slots);
-            if (frame) types += ' ';
             for (const auto& pair : out.pairs())
                 if (pair.is608()) types += static_cast<char>('0' + pair.type());
         }
         EXPECT_EQ(types, row.types) << row.rate.desc(true, true).asString();
-    }
-    for (const auto& rate : {Rate::f25p(), Rate::f50p(), Rate::f50i()}) {
-        QvCcProcessor queue;
-        queue.start(true, true, rate, 0);
-        QvCcData out;
-        EXPECT_THROW(queue.get(out, MediaTime()), QvAssertFailure);
     }
 }
 
 TEST(QvCcProcessor, DealsOutWhatIsDueAndFillsUp) {
     QvCcProcessor queue;
     QvCcData out;
+    std::string packets;
+    for (int i = 0; i < 18; ++i) packets += " fa0000";
     queue.start(true, false, QvFramerate::f30p(), QvCcProcessor::valid608_1);
     queue.get(out, MediaTime());
-    EXPECT_EQ(hex(out), "fc8080 f90000" + times("fa0000", 18));
+    EXPECT_EQ(hex(out), "fc8080 f90000" + packets);
 
     queue.append(listOf({0, 0, 1, 2, 3, 0}));
     queue.append(QvCcBytePair(MediaTime(6), 0, 1, 2, false));
-    const char* const expected[] = {"fc2000 fd2002", "fc2001 f90000", "fc8080 f90000"};
-    for (const char* leading : expected) {
+    for (const char* leading : {"fc2000 fd2002", "fc2001 f90000", "fc8080 f90000"}) {
         queue.get(out, MediaTime(4));
-        EXPECT_EQ(hex(out), leading + times("fa0000", 18));
+        EXPECT_EQ(hex(out), leading + packets);
     }
     EXPECT_EQ(hex(queue), "fe2003 ff2004 fc2005 f80102");  // DTVCC stays, and what is not due
     queue.get(out, MediaTime(6));
