@@ -213,7 +213,12 @@ AnyDict SccDec::inOut() const {
 int SccDec::readField(CCStream& stream, int field, QvFramerate& rate) {
     const auto index = static_cast<std::size_t>(field);
     const Any& file = settings_.filenames[index];
-    if (!file.isText() || !QvFile::isFile(file)) return QvStatus::ok;
+    if (!file.isText() || file.size() == 0) return QvStatus::ok;
+    if (!QvFile::isFile(file)) {
+        qv_log()->warning("There is no file %s for the captions of field %d", textOf(file).c_str(),
+                          field + 1);
+        return QvStatus::ok;
+    }
     QvCcData& data = stream.data[index];
     const bool fixed = settings_.framerate.isValid();
     if (fixed) rate = settings_.framerate.asFramerate();
