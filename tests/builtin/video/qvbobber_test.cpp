@@ -1,0 +1,188 @@
+#include "builtin/video/qvbobber.h"
+
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <cmath>
+#include <cstring>
+#include <functional>
+
+#include "builtin/video/bobrows.h"
+#include "tests/builtin/kernels/targets.h"
+#include "tests/support/log_capture.h"
+#include "tests/support/pictures.h"
+
+namespace {
+
+using Scene = std::function<int(int x, int y, int field)>;  // 0 to 255; fields count up, two a frame
+
+// Frame n of a scene as GRAY, shot interlaced.
+QvFrame shot(const Scene& scene, int n, int order = 1, int width = 40, int height = 24) {
+    QvFrame frame;
+    frame.init(QvFourcc::GRAY, width, height);
+    for (int y = 0; y < height; ++y)
+        for (int x = 0; x < width; ++x)
+            frame.plane()[y * frame.stride() + x] =
+                static_cast<unsigned char>(scene(x, y, 2 * n + (y % 2 == order - 1 ? 0 : 1)));
+    frame.framerate = QvFramerate(QvRatio(30000, 1001), order);
+    frame.frameNr = 50 + n;
+    return frame;
+}
+
+struct Bob : QvBobber {
+    explicit Bob(int alpha = 255) {
+        QvBobber::init();
+        setParam("alpha", alpha);
+        EXPECT_EQ(open(), 0);
+    }
+    // The largest error against the scene as it was, over the frames from the third on.
+    int worst(const Scene& scene, int order) {
+        int most = 0;
+        for (int n = 0; n < 5; ++n) {
+            QvFrame in = shot(scene, n, order);
+            EXPECT_EQ(write(in), 0);
+            for (int k = 0; k < 2; ++k, next()) {
+                if (n < 2) continue;
+                const QvFrame& out = *frame();
+                for (int y = 0; y < out.height(); ++y)
+                    for (int x = 0; x < out.width(); ++x)
+                        most = std::max(most,
+                                        std::abs(out.plane()[y * out.stride() + x] - scene(x, y, 2 * n + k)));
+            }
+        }
+        return most;
+    }
+};
+
+}  // namespace
+
+TEST(QvBobber, TwoFramesOfEachAtTwiceTheRate) {
+    LogCapture log;
+    Bob bob;
+    EXPECT_TRUE(log.contains("[bobber] opened"));
+    AnyDict captions("name", "cc_data");
+    int number = 100;
+    for (int n : {0, 1, 3}) {
+        QvFrame in = shot([](int, int, int field) { return field; }, n);
+        in.setSubpic(captions);
+        ASSERT_EQ(bob.write(in), 0);
+        for (int left = 2; left > 0; --left, bob.next()) {
+            EXPECT_EQ(bob.ready(), left);
+            const QvFrame& out = *bob.frame();
+            EXPECT_EQ(out.frameNr, number++);
+            EXPECT_TRUE(out.framerate == QvFramerate(QvRatio(60000, 1001)));
+            EXPECT_EQ(out.plane()[(2 - left) * out.stride()], 2 * n + 2 - left) << "row of the field shown";
+            EXPECT_EQ(out.subpic() != nullptr, left == 2) << "captions leave once";
+        }
+        EXPECT_EQ(bob.ready(), 0);
+    }
+    bob.close();
+    bob.open();
+    QvFrame again = shot([](int, int, int) { return 0; }, 3);
+    bob.write(again);
+    EXPECT_EQ(bob.frame()->frameNr, 106);
+    QvFrame hostile = again;
+    hostile.framerate = QvFramerate(QvRatio(2147483647, 1));
+    EXPECT_NE(bob.write(hostile), 0);
+    EXPECT_EQ(bob.ready(), 0);
+    EXPECT_EQ(bob.setParam("alpha", 256), -5);
+    EXPECT_EQ(bob.setParam("alpha", -1), -5);
+    AnyDict stored;
+    bob.setParam("alpha", 7);
+    bob.store(stored);
+    EXPECT_EQ(stored.get("state").asDict().getInt32("alpha"), 7);
+    stored.set("name", "flipper");
+    EXPECT_EQ(bob.restore(stored), -1);
+    EXPECT_TRUE(log.contains("[bobber] restore - invalid dict"));
+}
+
+TEST(QvBobber, NoCombWhereItMovesFullDetailWhereItStands) {
+    const Scene still = [](int x, int y, int) { return y == 9 || y == 14 || x == 5 ? 230 : 20; };
+    const Scene moving = [](int x, int, int field) { return (x - 5 * field) % 40 < 6 ? 230 : 20; };
+    const Scene slope = [](int x, int y, int field) { return 3 * x + 2 * y + 9 * field; };
+    const struct {
+        const char* what;
+        const Scene& scene;
+        int alpha, least, most;
+    } rows[] = {
+        {"still lines, woven", still, 255, 0, 0},           {"still lines, interpolated", still, 0, 200, 210},
+        {"moving bar, woven", moving, 255, 0, 0},           {"moving bar, interpolated", moving, 0, 0, 0},
+        {"a slope that brightens", slope, 255, 0, 2},       {"the same, interpolated", slope, 0, 0, 2},
+        {"still lines, half of each", still, 128, 95, 110},
+    };
+    for (const int order : {1, 2})
+        for (const auto& row : rows) {
+            const int worst = Bob(row.alpha).worst(row.scene, order);
+            EXPECT_GE(worst, row.least) << row.what << order;
+            EXPECT_LE(worst, row.most) << row.what << order;
+        }
+}
+
+TEST(QvBobber, EveryFormatAndShape) {
+    for (const QvPixelFormat& format : qvPixelFormats())
+        for (const int height : {1, 2, 3, 8}) {
+            Bob bob;
+            QvFrame in = makePicture(format.fourcc, 18, height, 7);
+            in.framerate.setInterlaced(1);
+            ASSERT_EQ(bob.write(in), 0);
+            ASSERT_EQ(bob.write(in), 0);
+            EXPECT_EQ(bob.ready(), 2);
+            // Noise that stands still comes out whole, but for bits that no sample has.
+            const bool isWhole = format.pixelBytes > 0 && format.fourcc != QvFourcc::R555;
+            for (; bob.ready() > 0 && height % 2 == 0; bob.next())
+                EXPECT_EQ(pictureBytes(*bob.frame()) == pictureBytes(in), isWhole) << in.str_four_cc();
+        }
+}
+
+// Against the formula in plain numbers, sample by sample, on every vector unit and with odd lengths.
+TEST(BobRows, AllUnitsFollowTheFormula) {
+    using qvbob::Samples;
+    const struct {
+        Samples samples;
+        int lane;
+        std::vector<std::pair<int, int>> fields;  // shift and bits
+    } layouts[] = {
+        {Samples::bytes, 1, {{0, 8}}},
+        {Samples::words, 2, {{0, 16}}},
+        {Samples::tens, 4, {{0, 10}, {10, 10}, {20, 10}}},
+        {Samples::rgb555, 2, {{0, 5}, {5, 5}, {10, 5}}},
+        {Samples::rgb565, 2, {{0, 5}, {5, 6}, {11, 5}}},
+    };
+    unsigned seed = 5;
+    std::vector<std::vector<unsigned char>> rows(7, std::vector<unsigned char>(303));
+    for (auto& row : rows)
+        for (auto& byte : row) byte = static_cast<unsigned char>((seed = seed * 1664525 + 1013904223) >> 24);
+    for (std::size_t i = 0; i < 303; i += 3)  // much stands nearly still
+        for (std::size_t r = 0; r < 3; ++r) rows[3 + r][i] = static_cast<unsigned char>(rows[r][i] ^ (i & 3));
+    for (const int64_t target : machineTargets())
+        for (const auto& layout : layouts)
+            for (const int w : {0, 77, 256})
+                for (const bool moved : {false, true}) {
+                    const OnTarget only(target);
+                    const std::size_t bytes = layout.lane == 1 ? 299 : 296;
+                    const qvbob::Triple now{&rows[0][1], &rows[1][1], &rows[2][1]};
+                    const qvbob::Triple before{&rows[3][1], &rows[4][1], &rows[5][1]};
+                    auto& out = rows[6];
+                    out[1 + bytes] = 0xA5;
+                    qvbob::fillRow(layout.samples, &out[1], now, moved ? qvbob::Triple() : before, w, bytes);
+                    EXPECT_EQ(out[1 + bytes], 0xA5) << "beyond the row";
+                    for (std::size_t i = 0; i + 4 <= bytes; i += static_cast<std::size_t>(layout.lane))
+                        for (const auto& [shift, bits] : layout.fields) {
+                            const auto at = [&, shift = shift, bits = bits](const unsigned char* row) {
+                                unsigned lane = 0;
+                                std::memcpy(&lane, row + i, static_cast<std::size_t>(layout.lane));
+                                return static_cast<int>(lane >> shift & ((1u << bits) - 1));
+                            };
+                            const int a = at(now.above), o = at(now.at), b = at(now.below);
+                            const int step12 = 12 * (1 << bits) / 256;
+                            const int change =
+                                moved ? step12
+                                      : std::max({std::abs(a - at(before.above)), std::abs(o - at(before.at)),
+                                                  std::abs(b - at(before.below))});
+                            const int room = 32 * std::max(step12 - change, 0);
+                            const int woven = std::clamp(o, std::min(a, b) - room, std::max(a, b) + room);
+                            ASSERT_EQ(at(&out[1]), (((a + b + 1) >> 1) * (256 - w) + woven * w + 128) >> 8)
+                                << static_cast<int>(layout.samples) << " byte " << i << " w " << w;
+                        }
+                }
+}
