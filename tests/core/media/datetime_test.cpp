@@ -17,13 +17,10 @@ TEST(QvDateTime, PacksInTimeOrder) {
         QvDateTime back;
         back.fromI64(moments[i].toI64());
         EXPECT_EQ(back, moments[i]);
-        if (i > 0) {
-            EXPECT_LT(moments[i - 1].toI64(), moments[i].toI64());
-            const bool earlier =
-                moments[i - 1].date < moments[i].date ||
-                (moments[i - 1].date == moments[i].date && moments[i - 1].time < moments[i].time);
-            EXPECT_TRUE(earlier);
-        }
+        if (i == 0) continue;
+        const QvDateTime &a = moments[i - 1], &b = moments[i];
+        EXPECT_LT(a.toI64(), b.toI64());
+        EXPECT_TRUE(a.date < b.date || (a.date == b.date && a.time < b.time)) << i;
     }
     EXPECT_EQ(QvDateTime({0, 0, 1}, {0, 0, 0, 0, 1}).toI64(), (1LL << 46) + 1);
 }

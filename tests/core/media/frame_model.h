@@ -21,6 +21,14 @@ struct FrameModel {
     unsigned char at(int plane, int row, int byte) const {
         return const_cast<FrameModel*>(this)->at(plane, row, byte);
     }
+    // Samples of one or two bytes, low byte first.
+    int sample(int plane, int row, int byte, int unit) const {
+        return at(plane, row, byte) + (unit == 2 ? 256 * at(plane, row, byte + 1) : 0);
+    }
+    void setSample(int plane, int row, int byte, int unit, int value) {
+        at(plane, row, byte) = static_cast<unsigned char>(value);
+        if (unit == 2) at(plane, row, byte + 1) = static_cast<unsigned char>(value >> 8);
+    }
     int rows(int plane) const { return plane ? height / 2 : height; }
     bool operator==(const FrameModel&) const = default;
 };
@@ -61,6 +69,12 @@ inline void makeNoise(QvFrame& frame, unsigned fourcc, int width, int height, in
     frame.framerate = QvFramerate(25.0, 1);
     frame.frameNr = static_cast<int>(seed);
     frame.setTimestamp(seed + 1);
+}
+
+inline QvFrame noiseFrame(unsigned fourcc, int width, int height, int padding, unsigned seed) {
+    QvFrame frame;
+    makeNoise(frame, fourcc, width, height, padding, seed);
+    return frame;
 }
 
 inline const std::vector<unsigned>& allFormats() {

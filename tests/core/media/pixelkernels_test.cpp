@@ -77,34 +77,25 @@ int masked(int target, int source, int mask) {
     return (target * (128 - w) + source * w) >> 7;
 }
 
-TEST(PixelKernels, Mask) {
+TEST(PixelKernels, MaskMixAndAverageInPlace) {
     checkKernel(1, qvpixels::maskBytes, masked);
     checkKernel(2, qvpixels::maskWords, masked);
-}
-
-TEST(PixelKernels, Mix) {
     for (const int alpha : {0, 1, 127, 128, 254, 255}) {
         const auto reference = [alpha](int target, int source, int) {
             return (target * (256 - alpha) + source * alpha) >> 8;
         };
         const auto with = [alpha](auto kernel) {
-            return [=](unsigned char* to, const unsigned char* from, const unsigned char*,
-                       std::size_t count) { kernel(to, from, alpha, count); };
+            return [=](auto* to, auto* from, auto*, std::size_t count) { kernel(to, from, alpha, count); };
         };
         checkKernel(1, with(qvpixels::mixBytes), reference);
         checkKernel(2, with(qvpixels::mixWords), reference);
     }
-}
-
-TEST(PixelKernels, AverageInPlace) {
     const auto inPlace = [](auto kernel) {
-        return [=](unsigned char* to, const unsigned char* from, const unsigned char*, std::size_t count) {
-            kernel(to, to, from, count);
-        };
+        return [=](auto* to, auto* from, auto*, std::size_t count) { kernel(to, to, from, count); };
     };
-    const auto reference = [](int target, int source, int) { return (target + source) / 2; };
-    checkKernel(1, inPlace(qvpixels::averageBytes), reference);
-    checkKernel(2, inPlace(qvpixels::averageWords), reference);
+    const auto average = [](int target, int source, int) { return (target + source) / 2; };
+    checkKernel(1, inPlace(qvpixels::averageBytes), average);
+    checkKernel(2, inPlace(qvpixels::averageWords), average);
 }
 
 TEST(PixelKernels, SpreadMask) {

@@ -30,8 +30,7 @@ TEST(QvFrameFill, Black) {
                 for (int p = 0; p < frame.planes(); ++p)
                     for (int i = 0; i < frame.plane_bytes(p); ++i)
                         ASSERT_EQ(frame.plane(p)[i], black(fourcc, p, i % frame.stride(p)))
-                            << frame.str_four_cc() << " plane " << p << " byte " << i << " padding "
-                            << padding;
+                            << frame.str_four_cc() << " plane " << p << " byte " << i;
             }
 }
 

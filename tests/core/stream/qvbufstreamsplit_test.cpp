@@ -1,11 +1,9 @@
 #include "core/stream/qvbufstreamsplit.h"
 
 #include <gmock/gmock.h>
-#include <gtest/gtest.h>
 
 #include <cerrno>
 
-#include "core/engine/qvexception.h"
 #include "core/engine/qvlog.h"
 #include "core/media/qvframe.h"
 #include "core/media/qvimage.h"
@@ -13,6 +11,7 @@
 #include "streamtools.h"
 #include "tests/support/platform_scope.h"
 #include "tests/support/temp_folder.h"
+#include "tests/support/wav_bytes.h"
 
 namespace {
 
@@ -28,8 +27,8 @@ AnyDict with(AnyDict params, const char* key, const Any& value) {
     return params;
 }
 
-std::vector<std::string> namesIn(const TempFolder& folder) {
-    std::vector<std::string> names;
+Texts namesIn(const TempFolder& folder) {
+    Texts names;
     for (const auto& entry : std::filesystem::directory_iterator(folder.path()))
         names.push_back(entry.path().filename().string());
     std::sort(names.begin(), names.end());
@@ -40,25 +39,20 @@ AnyDict pictures(const TempFolder& folder, const char* name = "clip.m2v") {
     return AnyDict("outfilename", folder.file(name).c_str(), "size", 4096, "chunk", 513);
 }
 
-struct NameCase {
-    Any digits;
-    std::vector<std::string> names;
-};
-
 TEST(QvBsSplitVideo, EachUnitIsAFileWithANumber) {
-    for (const NameCase& c : {NameCase{Any(), {"clip#0.m2v", "clip#1.m2v"}},
-                              {4, {"clip#0000.m2v", "clip#0001.m2v"}},
-                              {"4", {"clip#0.m2v", "clip#1.m2v"}},
-                              {-3, {"clip#0.m2v", "clip#1.m2v"}}}) {
+    for (const auto& [digits, names] : {std::pair{Any(), Texts{"clip#0.m2v", "clip#1.m2v"}},
+                                        {4, {"clip#0000.m2v", "clip#0001.m2v"}},
+                                        {"4", {"clip#0.m2v", "clip#1.m2v"}},
+                                        {-3, {"clip#0.m2v", "clip#1.m2v"}}}) {
         TempFolder folder;
         QvBsSplitVideo stream;
-        ASSERT_EQ(stream.init(with(pictures(folder), "nrDigits", c.digits)), 0);
+        ASSERT_EQ(stream.init(with(pictures(folder), "nrDigits", digits)), 0);
         unit(stream, VIDEO_AU_CODE, pattern(2000, 1));  // larger than a chunk
         unit(stream, VIDEO_AU_CODE, "");
         stream.destroy(0);
-        EXPECT_EQ(namesIn(folder), c.names);
-        EXPECT_TRUE(TempFolder::read(folder.file(c.names[0])) == pattern(2000, 1));
-        EXPECT_EQ(TempFolder::read(folder.file(c.names[1])), "");
+        EXPECT_EQ(namesIn(folder), names);
+        EXPECT_TRUE(TempFolder::read(folder.file(names[0])) == pattern(2000, 1));
+        EXPECT_EQ(TempFolder::read(folder.file(names[1])), "");
     }
 }
 
@@ -66,7 +60,7 @@ TEST(QvBsSplitVideo, UnitsRunOverTheEndOfTheRing) {
     TempFolder folder;
     QvBsSplitVideo stream;
     ASSERT_EQ(stream.init(with(pictures(folder), "split", 1)), 0);
-    std::vector<std::string> heard;
+    Texts heard;
     HeardItems observer(heard);
     EXPECT_EQ(stream.registerObserver(&observer), 0);
     for (unsigned i = 0; i < 20; ++i) unit(stream, VIDEO_AU_CODE, pattern(1500 + i, i));
@@ -82,7 +76,7 @@ TEST(QvBsSplitVideo, PlainModeIsAFile) {
     TempFolder folder;
     QvBsSplitVideo stream;
     EXPECT_THROW(stream.input(), QvAssertFailure);
-    std::vector<std::string> heard;
+    Texts heard;
     HeardItems observer(heard);
     stream.registerObserver(&observer);
     stream.setParam("outfilename", folder.file("all.m2v").c_str());
@@ -96,7 +90,7 @@ TEST(QvBsSplitVideo, PlainModeIsAFile) {
     EXPECT_EQ(heard.size(), 3u) << "the file goes on telling it";
     stream.destroy(0);
     EXPECT_EQ(TempFolder::read(folder.file("all.m2v")), "one two");
-    EXPECT_EQ(namesIn(folder), std::vector<std::string>{"all.m2v"});
+    EXPECT_EQ(namesIn(folder), Texts{"all.m2v"});
     EXPECT_EQ(stream.init(AnyDict("split", 0, "outfilename", folder.file("no/x").c_str())), -1);
     EXPECT_FALSE(stream.inited());
     EXPECT_NE(stream.ioError(), 0);
@@ -175,50 +169,29 @@ uint32_t le(const std::string& bytes, size_t at, size_t width) {
     return value;
 }
 
-struct HeaderCase {
-    int rate, channels, bits;
-    uint32_t valueBytes, container;
-};
-
 TEST(QvBsSplitAudio, HeaderStatesTheStreamExactly) {
-    for (const HeaderCase& c : {HeaderCase{48'000, 2, 16, 2, 16},
-                                {44'100, 1, 8, 1, 8},
-                                {96'000, 6, 24, 3, 24},
-                                {48'000, 2, 20, 3, 24},
-                                {8'000, 33, 32, 4, 32}}) {
+    for (const auto& [rate, channels, bits, width] : {std::tuple{48'000u, 2u, 16u, 2u},
+                                                      {44'100, 1, 8, 1},
+                                                      {96'000, 6, 24, 3},
+                                                      {48'000, 2, 20, 3},
+                                                      {8'000, 33, 32, 4}}) {
         TempFolder folder;
         QvBsSplitAudio stream;
-        ASSERT_EQ(stream.init(wav(folder, c.rate, c.channels, c.bits)), 0);
-        const auto channels = static_cast<uint32_t>(c.channels);
-        const std::string samples = pattern(c.valueBytes * channels * 100);
+        ASSERT_EQ(stream.init(wav(folder, int(rate), int(channels), int(bits))), 0);
+        const std::string samples = pattern(width * channels * 100), name = folder.file("take.wav");
         unit(stream, AUDIO_AU_CODE, std::string_view(samples).substr(0, 700));  // may end inside a sample
-        EXPECT_EQ(TempFolder::read(folder.file("take.wav")).substr(0, 80).find_first_not_of('\0'),
-                  std::string::npos);
+        EXPECT_EQ(TempFolder::read(name).substr(0, 80).find_first_not_of('\0'), std::string::npos);
         unit(stream, AUDIO_AU_CODE, std::string_view(samples).substr(std::min<size_t>(700, samples.size())));
         tell(stream.input(), STREAM_END_CODE);
         stream.destroy(0);
-        const std::string file = TempFolder::read(folder.file("take.wav"));
-        ASSERT_TRUE(file.substr(80) == samples.substr(0, file.size() - 80));
-        ASSERT_EQ(file.size(), 80 + samples.size());
-        EXPECT_EQ(file.substr(0, 4), "RIFF");
-        EXPECT_EQ(le(file, 4, 4), file.size() - 8);
-        EXPECT_EQ(file.substr(8, 8), "WAVEfmt ");
-        EXPECT_EQ(le(file, 16, 4), 40u);
-        EXPECT_EQ(le(file, 20, 2), 0xFFFEu);
-        EXPECT_EQ(le(file, 22, 2), channels);
-        EXPECT_EQ(le(file, 24, 4), static_cast<uint32_t>(c.rate));
-        EXPECT_EQ(le(file, 28, 4), c.valueBytes * channels * static_cast<uint32_t>(c.rate));
-        EXPECT_EQ(le(file, 32, 2), c.valueBytes * channels);
-        EXPECT_EQ(le(file, 34, 2), c.container);
-        EXPECT_EQ(le(file, 36, 2), 22u);
-        EXPECT_EQ(le(file, 38, 2), static_cast<uint32_t>(c.bits));
-        EXPECT_EQ(le(file, 40, 4), 0u);
-        EXPECT_EQ(file.substr(44, 16), std::string("\x01\0\0\0\0\0\x10\0\x80\0\0\xAA\0\x38\x9B\x71", 16));
-        EXPECT_EQ(file.substr(60, 4), "fact");
-        EXPECT_EQ(le(file, 64, 4), 4u);
-        EXPECT_EQ(le(file, 68, 4), 100 * channels);
-        EXPECT_EQ(file.substr(72, 4), "data");
-        EXPECT_EQ(le(file, 76, 4), samples.size());
+        const auto size = static_cast<uint32_t>(samples.size());
+        EXPECT_EQ(TempFolder::read(name),
+                  "RIFF" + leBytes(size + 72, 4) + "WAVEfmt " + leBytes(40, 4) + leBytes(0xFFFE, 2) +
+                      leBytes(channels, 2) + leBytes(rate, 4) + leBytes(width * channels * rate, 4) +
+                      leBytes(width * channels, 2) + leBytes(8 * width, 2) + leBytes(22, 2) +
+                      leBytes(bits, 2) + leBytes(0, 4) +
+                      std::string("\x01\0\0\0\0\0\x10\0\x80\0\0\xAA\0\x38\x9B\x71", 16) + "fact" +
+                      leBytes(4, 4) + leBytes(100 * channels, 4) + "data" + leBytes(size, 4) + samples);
         EXPECT_EQ(stream.ioError(), 0);
     }
 }
@@ -266,15 +239,10 @@ TEST(QvBsSplitAudio, AStreamThatEndsInsideASampleIsTold) {
 TEST(QvBsSplitAudio, RefusesWhatNoWavCanHold) {
     TempFolder folder;
     QvBsSplitAudio stream;
-    for (const auto& [rate, channels, bits, split] : {std::tuple{0, 2, 16, 0},
-                                                      {-1, 2, 16, 0},
-                                                      {48'000, 0, 16, 0},
-                                                      {48'000, -2, 16, 0},
-                                                      {48'000, 2, 0, 0},
-                                                      {48'000, 2, 33, 0},
-                                                      {48'000, 70'000, 16, 0},
-                                                      {48'000, 33, 16, 1},
-                                                      {48'000, 2, -8, 1}}) {
+    const int impossible[][4] = {{0, 2, 16, 0},           {-1, 2, 16, 0},      {48'000, 0, 16, 0},
+                                 {48'000, -2, 16, 0},     {48'000, 2, 0, 0},   {48'000, 2, 33, 0},
+                                 {48'000, 70'000, 16, 0}, {48'000, 33, 16, 1}, {48'000, 2, -8, 1}};
+    for (const auto& [rate, channels, bits, split] : impossible) {
         EXPECT_EQ(stream.init(wav(folder, rate, channels, bits, split)), -1)
             << rate << channels << bits << split;
         EXPECT_FALSE(stream.inited());

@@ -1,11 +1,9 @@
 #include "core/stream/qvfilebufstream.h"
 
 #include <gmock/gmock.h>
-#include <gtest/gtest.h>
 
 #include <cerrno>
 
-#include "core/engine/qvexception.h"
 #include "core/engine/qvlog.h"
 #include "streamtools.h"
 #include "tests/support/platform_scope.h"
@@ -22,45 +20,44 @@ AnyDict source(const std::string& name, int size = 64) {
     return AnyDict("infilename", name.c_str(), "size", size);
 }
 
+// A stream in a folder of its own; most tests write to "a.bin".
+class FileStream : public testing::Test {
+  protected:
+    bufstream* begin(const std::string& name = "a.bin", int size = 64) {
+        EXPECT_EQ(stream.init(output(folder.file(name), size)), 0);
+        return stream.input();
+    }
+    std::string bytes(const std::string& name = "a.bin") const { return TempFolder::read(folder.file(name)); }
+
+    TempFolder folder;
+    QvFileBufStream stream;
+};
+
 std::string nameOf(bufstream* bs) {
     unsigned short units[300] = {};
     if (bs->auxinfo(bs, 0, FILE_NAME_INFO, units, sizeof units)) return "?";
     return qv_narrow_name(units, QvWideString(units).size());
 }
 
-TEST(QvFileBufStream, WritesBlocksAndBytesInOrder) {
-    TempFolder folder;
-    QvFileBufStream stream;
+TEST_F(FileStream, WritesBlocksAndBytesInOrder) {
     EXPECT_THROW(stream.input(), QvAssertFailure);
     EXPECT_THROW(stream.output(), QvAssertFailure);
-    ASSERT_EQ(stream.init(output(folder.file("a.bin"))), 0);
-    bufstream* in = stream.input();
-    EXPECT_EQ(stream.output(), nullptr);
-    EXPECT_EQ(in->chunksize(in), 64u);
-    EXPECT_FALSE(in->request(in, 65));
-    EXPECT_EQ(in->flags, 1u);
-
+    bufstream* in = begin();
+    EXPECT_TRUE(!stream.output() && in->chunksize(in) == 64u && in->flags == 1u && !in->request(in, 65));
     std::string expected;
     for (unsigned i = 0; i < 40; ++i) {
-        const std::string block = pattern(i % 65, i);
+        const std::string block = pattern(i % 65, i), more = pattern(i % 3 ? 0 : i * 7 % 200, i + 100);
         ASSERT_TRUE(put(in, block));
-        expected += block;
-        const std::string bytes = pattern(i * 7 % 200, i + 100);
-        if (i % 3 == 0) {
-            ASSERT_EQ(copyIn(in, bytes), bytes.size());
-            expected += bytes;
-        }
+        ASSERT_EQ(copyIn(in, more), more.size());
+        expected += block + more;
     }
     stream.destroy(0);
     EXPECT_EQ(stream.ioError(), 0);
-    EXPECT_EQ(TempFolder::read(folder.file("a.bin")), expected);
+    EXPECT_EQ(bytes(), expected);
 }
 
-TEST(QvFileBufStream, AFullBufferLeavesRoom) {
-    TempFolder folder;
-    QvFileBufStream stream;
-    ASSERT_EQ(stream.init(output(folder.file("a.bin"))), 0);
-    bufstream* in = stream.input();
+TEST_F(FileStream, AFullBufferLeavesRoom) {
+    bufstream* in = begin();
     ASSERT_TRUE(put(in, pattern(60)));
     EXPECT_EQ(usable(in), 4u);
     ASSERT_TRUE(put(in, "abcd"));
@@ -68,9 +65,7 @@ TEST(QvFileBufStream, AFullBufferLeavesRoom) {
     EXPECT_EQ(in->confirm(in, 1000), 64u) << "bounded by the buffer";
 }
 
-TEST(QvFileBufStream, DefaultSizeAndWhatCanNotBeOpened) {
-    TempFolder folder;
-    QvFileBufStream stream;
+TEST_F(FileStream, DefaultSizeAndWhatCanNotBeOpened) {
     ASSERT_EQ(stream.init(AnyDict("outfilename", folder.file("a").c_str())), 0);
     EXPECT_EQ(stream.size(), 8'388'608);
     for (const std::string& bad : {folder.file("none/a"), folder.path().string(), std::string(),
@@ -86,32 +81,28 @@ TEST(QvFileBufStream, DefaultSizeAndWhatCanNotBeOpened) {
     EXPECT_EQ(stream.init(output(folder.file("b"))), -1);
 }
 
-TEST(QvFileBufStream, NamesOfAnyKindReachTheDisc) {
-    TempFolder folder;
-    const Any wide = Any(folder.file("").c_str()).toWString();
-    const unsigned short text[] = {0x0416, 0xD83D, 0xDE00, '.', 'b', 0};
-    for (const Any& name : {Any::strcat(wide, Any(text)), Any(folder.file("not\xFFutf8\xC3").c_str())}) {
-        QvFileBufStream stream;
+TEST_F(FileStream, NamesOfAnyKindReachTheDisc) {
+    for (const Any& name :
+         {wide(folder.file("\xD0\x96\xF0\x9F\x98\x80.b")), narrow(folder.file("not\xFFutf8\xC3"))}) {
         ASSERT_EQ(stream.init(AnyDict("outfilename", name)), 0);
         ASSERT_EQ(copyIn(stream.input(), "content"), 7u);
         EXPECT_EQ(tell(stream.input(), BUF_SEEK_INFO, BufSeekInfo{0, "C", 1}), 0u);
         stream.destroy(0);
         ASSERT_EQ(stream.init(AnyDict("infilename", name)), 0);
         EXPECT_EQ(copyOut(stream.output(), 100), "Content");
+        stream.destroy(0);
+        stream.setParamDict(AnyDict("infilename", Any()));
     }
-    EXPECT_EQ(TempFolder::read(folder.file("not\xFFutf8\xC3")), "Content");
-    EXPECT_EQ(TempFolder::read(folder.file("\xD0\x96\xF0\x9F\x98\x80.b")), "Content");
+    EXPECT_EQ(bytes("not\xFFutf8\xC3"), "Content");
+    EXPECT_EQ(bytes("\xD0\x96\xF0\x9F\x98\x80.b"), "Content");
 }
 
-TEST(QvFileBufStream, AnswersAboutItself) {
-    TempFolder folder;
-    QvFileBufStream stream;
+TEST_F(FileStream, AnswersAboutItself) {
     std::vector<std::string> heard;
     HeardItems observer(heard);
     EXPECT_EQ(stream.registerObserver(&observer), 0);
     EXPECT_EQ(stream.registerObserver(&observer), -1);
-    ASSERT_EQ(stream.init(output(folder.file("a.bin"))), 0);
-    bufstream* in = stream.input();
+    bufstream* in = begin();
     put(in, "12345");
     copyIn(in, "678");
     put(in, "9");
@@ -119,86 +110,58 @@ TEST(QvFileBufStream, AnswersAboutItself) {
     EXPECT_EQ(ask<uint32_t>(in, BYTECOUNT_INFO), 0u) << "needs 64 bits";
     EXPECT_EQ(nameOf(in), folder.file("a.bin"));
     EXPECT_EQ(tell(in, FLUSH_BUFFER), 0u);
-    EXPECT_EQ(TempFolder::read(folder.file("a.bin")), "12345678") << "the record's own buffer stays";
+    EXPECT_EQ(bytes(), "12345678") << "the record's own buffer stays";
     EXPECT_EQ(stream.writeOut(), 0);
-    EXPECT_EQ(TempFolder::read(folder.file("a.bin")), "123456789");
+    EXPECT_EQ(bytes(), "123456789");
     EXPECT_THAT(heard, testing::ElementsAre("BYTECOUNT_INFO/0/8", "BYTECOUNT_INFO/0/4", "?/0/600",
                                             "FLUSH_BUFFER/0/0"));
 }
 
-struct SplitCase {
-    const char* name;
-    std::vector<const char*> files;
-};
-
-TEST(QvFileBufStream, SplitsIntoNumberedFiles) {
-    for (const SplitCase& c : {SplitCase{"clip.mpg", {"clip.mpg", "clip001.mpg", "clip002.mpg"}},
-                               {"clip", {"clip", "clip001", "clip002"}},
-                               {"a.b.c", {"a.b.c", "a.b001.c", "a.b002.c"}}}) {
-        TempFolder folder;
-        QvFileBufStream stream;
-        ASSERT_EQ(stream.init(output(folder.file(c.name))), 0);
-        bufstream* in = stream.input();
+TEST_F(FileStream, SplitsIntoNumberedFiles) {
+    for (const auto& [name, second, third] : {std::tuple{"clip.mpg", "clip001.mpg", "clip002.mpg"},
+                                              {"clip", "clip001", "clip002"},
+                                              {"a.b.c", "a.b001.c", "a.b002.c"}}) {
+        bufstream* in = begin(name);
         put(in, "first");
         EXPECT_EQ(tell(in, SPLIT_OUTPUT), 0u);
         EXPECT_EQ(ask<uint64_t>(in, BYTECOUNT_INFO), 0u);
         EXPECT_EQ(ask<int32_t>(in, FILE_SPLIT_COUNT_INFO), 1);
         put(in, "second");
         EXPECT_EQ(in->split(in), 0u);
-        EXPECT_EQ(nameOf(in), folder.file(c.files[2]));
+        EXPECT_EQ(nameOf(in), folder.file(third));
         put(in, "third");
         stream.destroy(0);
-        EXPECT_EQ(TempFolder::read(folder.file(c.files[0])), "first");
-        EXPECT_EQ(TempFolder::read(folder.file(c.files[1])), "second");
-        EXPECT_EQ(TempFolder::read(folder.file(c.files[2])), "third");
+        EXPECT_EQ(bytes(name) + bytes(second) + bytes(third), "firstsecondthird");
+    }
+    bufstream* in = begin("v.x");
+    for (const int count : {999, 1000, 1001}) {
+        while (ask<int32_t>(in, FILE_SPLIT_COUNT_INFO) < count) ASSERT_EQ(in->split(in), 0u);
+        EXPECT_EQ(nameOf(in), folder.file("v" + std::to_string(count) + ".x"));
     }
 }
 
-TEST(QvFileBufStream, TheThousandthSplitWidensTheNumber) {
-    TempFolder folder;
-    QvFileBufStream stream;
-    ASSERT_EQ(stream.init(output(folder.file("v.x"))), 0);
-    bufstream* in = stream.input();
-    const auto splitTo = [&](int count) {
-        while (ask<int32_t>(in, FILE_SPLIT_COUNT_INFO) < count) ASSERT_EQ(in->split(in), 0u);
-    };
-    splitTo(999);
-    EXPECT_EQ(nameOf(in), folder.file("v999.x"));
-    splitTo(1000);
-    EXPECT_EQ(nameOf(in), folder.file("v1000.x"));
-    splitTo(1001);
-    EXPECT_EQ(nameOf(in), folder.file("v1001.x"));
-}
-
 // The dot of a folder's name counts when the file has none, and that folder isn't there.
-TEST(QvFileBufStream, ASplitThatFailsLeavesNoFileAndIsTold) {
-    TempFolder folder;
+TEST_F(FileStream, ASplitThatFailsLeavesNoFileAndIsTold) {
     ASSERT_TRUE(std::filesystem::create_directory(folder.file("dir.v1")));
-    QvFileBufStream stream;
-    ASSERT_EQ(stream.init(output(folder.file("dir.v1/clip"))), 0);
-    bufstream* in = stream.input();
+    bufstream* in = begin("dir.v1/clip");
     put(in, "kept");
     EXPECT_EQ(in->split(in), BUFSTREAM_FAILED);
     EXPECT_FALSE(in->request(in, 1));
     EXPECT_EQ(copyIn(in, "x"), 0u);
     EXPECT_EQ(stream.ioError(), ENOENT);
     stream.destroy(0);
-    EXPECT_EQ(TempFolder::read(folder.file("dir.v1/clip")), "kept");
+    EXPECT_EQ(bytes("dir.v1/clip"), "kept");
 }
 
-TEST(QvFileBufStream, AFullDiscReachesTheWriterAndWhoeverCloses) {
-    TempFolder folder;
+TEST_F(FileStream, AFullDiscReachesTheWriterAndWhoeverCloses) {
     FullDisc disc(10'000);
     PlatformScope scope(disc);
     qv_log()->clear();
-    QvFileBufStream stream;
-    ASSERT_EQ(stream.init(output(folder.file("full.bin"), 4000)), 0);
-    bufstream* in = stream.input();
+    bufstream* in = begin("full.bin", 4000);
     int blocks = 0;
     while (blocks < 100 && put(in, pattern(3000))) ++blocks;
     EXPECT_LT(blocks, 8);
-    EXPECT_FALSE(in->request(in, 1));
-    EXPECT_EQ(copyIn(in, "x"), 0u);
+    EXPECT_TRUE(!in->request(in, 1) && copyIn(in, "x") == 0);
     EXPECT_EQ(stream.ioError(), ENOSPC);
     EXPECT_NE(stream.ioErrorText().find("full.bin"), std::string::npos) << stream.ioErrorText();
     EXPECT_EQ(qv_log()->nrErrors(), 1) << "told once";
@@ -206,25 +169,19 @@ TEST(QvFileBufStream, AFullDiscReachesTheWriterAndWhoeverCloses) {
     EXPECT_EQ(stream.ioError(), ENOSPC);
 
     // All that was written fits into buffers: only closing finds out.
-    ASSERT_EQ(stream.init(output(folder.file("small.bin"), 4000)), 0);
-    EXPECT_EQ(stream.ioError(), 0);
-    ASSERT_TRUE(put(stream.input(), "abc"));
-    stream.destroy(0);
-    EXPECT_EQ(stream.ioError(), ENOSPC);
-
-    ASSERT_EQ(stream.init(output(folder.file("small.bin"), 4000)), 0);
-    ASSERT_TRUE(put(stream.input(), "abc"));
-    EXPECT_EQ(stream.writeOut(), -1);
-    EXPECT_EQ(stream.ioError(), ENOSPC);
+    for (const bool asked : {false, true}) {
+        in = begin("small.bin", 4000);
+        EXPECT_EQ(stream.ioError(), 0);
+        ASSERT_TRUE(put(in, "abc"));
+        EXPECT_EQ(asked ? stream.writeOut() : -1, -1);
+        if (!asked) stream.destroy(0);
+        EXPECT_EQ(stream.ioError(), ENOSPC);
+    }
 }
 
-TEST(QvFileBufStream, PatchesGoInWhenTheFileIsClosed) {
-    TempFolder folder;
-    const std::string name = folder.file("a.bin");
+TEST_F(FileStream, PatchesGoInWhenTheFileIsClosed) {
     for (const int abort : {0, 1}) {
-        QvFileBufStream stream;
-        ASSERT_EQ(stream.init(output(name)), 0);
-        bufstream* in = stream.input();
+        bufstream* in = begin();
         put(in, "0123456789");
         std::string data = "AB";
         EXPECT_EQ(tell(in, BUF_SEEK_INFO, BufSeekInfo{1, data.data(), 2}), 0u);
@@ -232,72 +189,56 @@ TEST(QvFileBufStream, PatchesGoInWhenTheFileIsClosed) {
         tell(in, BUF_SEEK_INFO, BufSeekInfo{2, "c", 1});
         put(in, "tail");
         stream.destroy(abort);
-        EXPECT_EQ(TempFolder::read(name), abort ? "0123456789tail" : "0Ac3456789tail");
+        EXPECT_EQ(bytes(), abort ? "0123456789tail" : "0Ac3456789tail");
         EXPECT_EQ(stream.ioError(), 0);
     }
-    QvFileBufStream stream;
-    ASSERT_EQ(stream.init(output(name)), 0);
-    bufstream* in = stream.input();
+    bufstream* in = begin();
     put(in, "0123");
     tell(in, BUF_SEEK_INFO, BufSeekInfo{-5, "x", 1});
     tell(in, BUF_SEEK_INFO, BufSeekInfo{0, "x", 1});
     stream.destroy(0);
-    EXPECT_EQ(TempFolder::read(name), "0123") << "nothing after the patch that failed";
+    EXPECT_EQ(bytes(), "0123") << "nothing after the patch that failed";
     EXPECT_EQ(stream.ioError(), EINVAL);
 }
 
-TEST(QvFileBufStream, FlushEndsThePatchesWhileTheFileIsOpen) {
-    TempFolder folder;
-    QvFileBufStream stream;
-    ASSERT_EQ(stream.init(output(folder.file("a.bin"))), 0);
-    bufstream* in = stream.input();
+TEST_F(FileStream, FlushEndsThePatchesWhileTheFileIsOpen) {
+    bufstream* in = begin();
     put(in, "0123456789");
     tell(in, BUF_SEEK_INFO, BufSeekInfo{4, "ABC", 3});
     stream.flush();
-    EXPECT_EQ(TempFolder::read(folder.file("a.bin")), "0123ABC789");
+    EXPECT_EQ(bytes(), "0123ABC789");
     EXPECT_FALSE(stream.input()->request(in, 1));
     EXPECT_EQ(tell(in, BUF_SEEK_INFO, BufSeekInfo{0, "Z", 1}), BUFSTREAM_FAILED);
     stream.flush();
     stream.destroy(0);
-    EXPECT_EQ(TempFolder::read(folder.file("a.bin")), "0123ABC789");
+    EXPECT_EQ(bytes(), "0123ABC789");
 }
 
-TEST(QvFileBufStream, CopiesNameOneFileThatEndsOnce) {
-    TempFolder folder;
-    QvFileBufStream first;
-    ASSERT_EQ(first.init(output(folder.file("a.bin"))), 0);
-    put(first.input(), "abc");
+TEST_F(FileStream, CopiesNameOneFileThatEndsOnce) {
+    put(begin(), "abc");
     {
-        QvFileBufStream second(first);
+        QvFileBufStream second(stream);
         put(second.input(), "def");
     }
-    EXPECT_EQ(TempFolder::read(folder.file("a.bin")), "abcdef");
-    EXPECT_TRUE(first.inited());
-    EXPECT_EQ(first.input(), nullptr);
+    EXPECT_EQ(bytes(), "abcdef");
+    EXPECT_TRUE(stream.inited() && !stream.input());
     QvFileBufStream other;
     ASSERT_EQ(other.init(output(folder.file("b.bin"))), 0);
     put(other.input(), "b");
-    other = first;
-    EXPECT_EQ(TempFolder::read(folder.file("b.bin")), "b") << "what nobody names any more is closed";
-    first.destroy(0);
+    other = stream;
+    EXPECT_EQ(bytes("b.bin"), "b") << "what nobody names any more is closed";
+    stream.destroy(0);
 }
 
-TEST(QvFileBufStream, ReadsByBlocksAndBytes) {
-    TempFolder folder;
+TEST_F(FileStream, ReadsByBlocksAndBytes) {
     const std::string content = pattern(1000);
-    QvFileBufStream stream;
     ASSERT_EQ(stream.init(source(folder.write("a.bin", content), 100)), 0);
     bufstream* out = stream.output();
-    EXPECT_EQ(stream.input(), nullptr);
-    EXPECT_EQ(out->flags, 0u);
-    EXPECT_EQ(out->split, nullptr);
+    EXPECT_TRUE(!stream.input() && out->flags == 0 && !out->split);
     EXPECT_EQ(usable(out), 0u) << "nothing is buffered yet";
     EXPECT_EQ(ask<uint64_t>(out, FILE_SIZE_INFO), 1000u);
     std::string read = take(out, 30);
-    read += take(out, 90);
-    read += copyOut(out, 5);
-    read += copyOut(out, 333);
-    read += take(out, 100);
+    for (const unsigned n : {5u, 333u}) read += take(out, 90).append(copyOut(out, n));
     EXPECT_EQ(ask<uint64_t>(out, BYTECOUNT_INFO), read.size());
     EXPECT_FALSE(out->request(out, 101)) << "more than the buffer";
     ASSERT_TRUE(out->request(out, 40));
@@ -306,15 +247,12 @@ TEST(QvFileBufStream, ReadsByBlocksAndBytes) {
     read += content.substr(read.size(), buffered);
     read += copyOut(out, 10'000);
     EXPECT_TRUE(read == content);
-    EXPECT_FALSE(out->request(out, 1));
-    EXPECT_EQ(copyOut(out, 1), "");
+    EXPECT_TRUE(!out->request(out, 1) && copyOut(out, 1).empty());
     stream.flush();
-    EXPECT_EQ(stream.ioError(), 0);
-    EXPECT_EQ(stream.writeOut(), -1);
+    EXPECT_TRUE(stream.ioError() == 0 && stream.writeOut() == -1);
 }
 
-TEST(QvFileBufStream, SwapsPairsWhateverTheLengthOfTheReads) {
-    TempFolder folder;
+TEST_F(FileStream, SwapsPairsWhateverTheLengthOfTheReads) {
     for (const size_t length : {1000u, 1001u}) {
         const std::string content = pattern(length);
         std::string swapped = content;
@@ -409,9 +347,7 @@ TEST(QvNullBufStream, CountsAndDrops) {
     EXPECT_EQ(usable(in), 10u);
     EXPECT_FALSE(in->request(in, 11));
     EXPECT_EQ(ask<uint64_t>(in, BYTECOUNT_INFO), 1010u);
-    const uint32_t access[4] = {1, 2, 3, 4};
-    uint32_t words[4];
-    std::memcpy(words, access, sizeof words);
+    uint32_t words[4] = {1, 2, 3, 4};
     EXPECT_EQ(in->auxinfo(in, 0, ACCESS_INFO, words, sizeof words), 0u);
     EXPECT_THAT(words, testing::ElementsAre(1, 2, 3, 0));
     EXPECT_EQ(tell(in, ACCESS_INFO), BUFSTREAM_FAILED);

@@ -9,6 +9,7 @@
 
 #include "core/stream/bufstream.h"
 #include "core/stream/qvbufstrm.h"
+#include "tests/support/checks.h"
 
 inline unsigned char* bytesOf(std::string_view text) {
     return reinterpret_cast<unsigned char*>(const_cast<char*>(text.data()));
