@@ -2,11 +2,9 @@
 
 #include <gtest/gtest.h>
 
-#include <filesystem>
 #include <string>
 #include <vector>
 
-#include "core/decode/decodefactory.h"
 #include "core/engine/qvexception.h"
 #include "core/transcode/qvtranscodetask.h"
 #include "core/transcode/translink.h"
@@ -213,8 +211,8 @@ class CaptionPipe : public FakeEncodePipe {
 };
 
 TEST_F(SccDecoder, CaptionsOfALinkedFileReachTheEncoder) {
-    const auto one = file("a.scc", "00:00:00:04 9420 9421 9422\n00:00:00:29 942f\n");
-    const auto two = file("b.scc", "00:00:00:05 1520 1521\n00:00:00:29 152f\n");
+    const auto both = file("a.scc", "00:00:00:04 9420 9421 9422\n00:00:00:29 942f\n") + "," +
+                      file("b.scc", "00:00:00:05 1520 1521\n00:00:00:29 152f\n");
     const struct {
         QvFramerate video;
         const char* text;
@@ -227,7 +225,7 @@ TEST_F(SccDecoder, CaptionsOfALinkedFileReachTheEncoder) {
         {QvFramerate::f23p(), "4:0 9420 4:1 1520 5:0 9421 5:1 1521 5:0 9422 24:0 942f 24:1 152f "},
     };
     for (const auto& row : rows) {
-        ASSERT_EQ(open(one + "," + two), 0);
+        ASSERT_EQ(open(both), 0);
         FakeDecoder video(70, row.video);
         CaptionPipe pipe(row.video);
         QvTask task;
