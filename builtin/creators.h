@@ -27,6 +27,8 @@ QvCodec* newEncpipe();
 QvCodec* newScaler();
 QvCodec* newDeinterlace();
 QvCodec* newFlipper();
+QvCodec* newLogo();
+QvCodec* newAnimatedlogo();
 QvCodec* newCropper();
 QvCodec* newBrightness();
 QvCodec* newVideofade();

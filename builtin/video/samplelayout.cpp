@@ -151,41 +151,53 @@ void SampleWeights::apply(unsigned char* to, const unsigned char* from, size_t f
         default: break;
     }
     apart_.resize(samples);
-    takeApart(*layout_, from, apart_.data(), samples);
+    layout_->read(from, apart_.data(), samples);
     auto* words = reinterpret_cast<unsigned char*>(apart_.data());
     srk::weighWords(words, words, scale16_.data() + first, add16_.data() + first, samples);
-    putTogether(*layout_, apart_.data(), to, samples);
+    layout_->write(apart_.data(), to, samples);
 }
 
-void takeApart(const SampleLayout& layout, const unsigned char* from, uint16_t* words, size_t samples) {
-    if (layout.store == SampleLayout::v210) {
-        for (size_t i = 0; i < samples; i += 3, from += 4) {
-            const uint32_t three = word32(from);
-            for (unsigned k = 0; k < 3; ++k) words[i + k] = static_cast<uint16_t>(three >> 10 * k & 1023);
-        }
-        return;
+void SampleLayout::read(const unsigned char* from, uint16_t* to, size_t samples) const {
+    switch (store) {
+        case bytes: std::copy_n(from, samples, to); return;
+        case words: std::memcpy(to, from, 2 * samples); return;
+        case v210:
+            for (size_t i = 0; i < samples; i += 3, from += 4) {
+                const uint32_t three = word32(from);
+                for (unsigned k = 0; k < 3; ++k) to[i + k] = static_cast<uint16_t>(three >> 10 * k & 1023);
+            }
+            return;
+        case r555:
+        case r565: break;
     }
-    const unsigned greenBits = layout.store == SampleLayout::r565 ? 6 : 5;
+    const unsigned greenBits = store == r565 ? 6 : 5;
     for (size_t i = 0; i < samples; i += pixelSamples, from += 2) {
         const unsigned pixel = from[0] | unsigned{from[1]} << 8;
-        words[i] = pixel & 31;
-        words[i + 1] = static_cast<uint16_t>(pixel >> 5 & ((1u << greenBits) - 1));
-        words[i + 2] = pixel >> (5 + greenBits) & 31;
+        to[i] = pixel & 31;
+        to[i + 1] = static_cast<uint16_t>(pixel >> 5 & ((1u << greenBits) - 1));
+        to[i + 2] = pixel >> (5 + greenBits) & 31;
     }
 }
 
-void putTogether(const SampleLayout& layout, const uint16_t* words, unsigned char* to, size_t samples) {
-    if (layout.store == SampleLayout::v210) {
-        for (size_t i = 0; i < samples; i += 3, to += 4) {
-            const uint32_t three = words[i] | uint32_t{words[i + 1]} << 10 | uint32_t{words[i + 2]} << 20;
-            std::memcpy(to, &three, 4);
-        }
-        return;
+void SampleLayout::write(const uint16_t* from, unsigned char* to, size_t samples) const {
+    switch (store) {
+        case bytes:
+            for (size_t i = 0; i < samples; ++i) to[i] = static_cast<unsigned char>(from[i]);
+            return;
+        case words: std::memcpy(to, from, 2 * samples); return;
+        case v210:
+            for (size_t i = 0; i < samples; i += 3, to += 4) {
+                const uint32_t three = from[i] | uint32_t{from[i + 1]} << 10 | uint32_t{from[i + 2]} << 20;
+                std::memcpy(to, &three, 4);
+            }
+            return;
+        case r555:
+        case r565: break;
     }
-    const unsigned greenBits = layout.store == SampleLayout::r565 ? 6 : 5;
+    const unsigned greenBits = store == r565 ? 6 : 5;
     for (size_t i = 0; i < samples; i += pixelSamples, to += 2) {
         const unsigned pixel =
-            words[i] | unsigned{words[i + 1]} << 5 | unsigned{words[i + 2]} << (5 + greenBits);
+            from[i] | unsigned{from[i + 1]} << 5 | unsigned{from[i + 2]} << (5 + greenBits);
         to[0] = static_cast<unsigned char>(pixel);
         to[1] = static_cast<unsigned char>(pixel >> 8);
     }

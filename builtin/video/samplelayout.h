@@ -42,6 +42,9 @@ struct SampleLayout {
     size_t rowSamples(const QvFrame& frame, int plane) const;
     // Of a pixel that begins a byte, and of v210 a group of six.
     std::ptrdiff_t byteOffset(int plane, int pixel) const;
+    // A row as words, and back; whole pixels, of v210 whole groups of six.
+    void read(const unsigned char* from, uint16_t* words, size_t samples) const;
+    void write(const uint16_t* words, unsigned char* to, size_t samples) const;
     // A bit for each of the first four samples of plane 0 that has this role.
     unsigned chosen(SampleRole role) const;
 };
@@ -77,7 +80,3 @@ class SampleWeights {
     std::vector<uint32_t> scale16_, add16_;
     std::vector<uint16_t> apart_;  // a row of packed samples
 };
-
-// A row of packed samples as words, and back; whole pixels, of v210 whole groups of six.
-void takeApart(const SampleLayout& layout, const unsigned char* from, uint16_t* words, size_t samples);
-void putTogether(const SampleLayout& layout, const uint16_t* words, unsigned char* to, size_t samples);
