@@ -145,6 +145,11 @@ void Job::planStreams() {
                                        ? "no input has sound for " + inQuotes(options_.output)
                                        : std::string("no input has a picture or sound"));
     checkPicture();
+    // As captions, of which raw pictures hold none.
+    for (const auto& source : sources_)
+        if (std::none_of(streams_.begin(), streams_.end(),
+                         [&](const auto& s) { return s.source == source.get(); }))
+            warnings_.push_back("nothing of " + inQuotes(source->name()) + " goes into the output");
 }
 
 void Job::checkPicture() const {

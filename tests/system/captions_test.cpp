@@ -55,7 +55,12 @@ TEST_F(Captions, InfoTellsWhatATextFileHolds) {
                        testing::HasSubstr("\"duration_s\": 2.0")));
 }
 
-TEST_F(Captions, WhatHasNoneIsRefused) {
+TEST_F(Captions, WhatHasNoneOrHoldsNoneIsTold) {
+    folder.write("text.srt", "1\n00:00:01,000 --> 00:00:02,000\nHi\n");
+    const Outcome ran =
+        tarsel({"transcode", "testgen:size=64x64,duration=1f,audio=0", "text.srt", "-o", "a.yuv"});
+    EXPECT_EQ(ran.status, 0) << ran.err;
+    EXPECT_THAT(ran.err, testing::HasSubstr("nothing of 'text.srt' goes into the output"));
     folder.write("text.scc", "1\n00:00:01,000 --> 00:00:02,000\nHi\n");
     folder.write("none.scc", "Scenarist_SCC V1.0\n");
     for (const char* name : {"text.scc", "none.scc", "absent.scc"}) {
