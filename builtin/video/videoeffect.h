@@ -10,8 +10,10 @@
 //     };
 #pragma once
 
+#include <cstring>
 #include <span>
 
+#include "builtin/video/paramset.h"
 #include "core/engine/params.h"
 #include "core/filter/qvfilter.h"
 #include "core/media/qvframe.h"
@@ -62,8 +64,14 @@ class VideoEffectOf : public VideoEffect {
         if (const auto result = _setRow<Settings>(rows_, settings_, name, value)) return *result;
         return VideoEffect::setParam(name, value);
     }
+    // Beside the rows "paramSet", if some have a description.
     void getParam(const char* name, Any& value) const override {
-        if (!qvGetParamRow<Settings>(rows_, settings_, name, value)) VideoEffect::getParam(name, value);
+        if (qvGetParamRow<Settings>(rows_, settings_, name, value)) return;
+        if (std::strcmp(name, "paramSet") == 0) {
+            if (const AnyVector set = qvParamSet(rows_); !set.empty()) value = set;
+            return;
+        }
+        VideoEffect::getParam(name, value);
     }
     void store(AnyDict& dict) const override {
         VideoEffect::store(dict);

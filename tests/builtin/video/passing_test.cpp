@@ -1,0 +1,110 @@
+// Filters that let frames pass: the raw dump and the user data callback.
+#include <fstream>
+
+#include "builtin/video/dumpraw.h"
+#include "builtin/video/userdata.h"
+#include "core/value/anycontainer.h"
+#include "tests/builtin/video/effect_frames.h"
+#include "tests/support/log_capture.h"
+#include "tests/support/platform_scope.h"
+#include "tests/support/temp_folder.h"
+
+namespace {
+
+using Dump = OpenedEffect<DumpRaw>;
+using Callback = OpenedEffect<UserData>;
+
+struct Seen {
+    int frames = 0, last = -1;
+};
+
+void countFrames(void* context, QvFrame& frame) {
+    auto& seen = *static_cast<Seen*>(context);
+    ++seen.frames;
+    seen.last = frame.frameNr;
+    frame.plane()[0] = 77;
+}
+
+Any pointer(void* p) { return Any(static_cast<const void*>(p)); }
+
+}  // namespace
+
+TEST(DumpRaw, WritesFramesAsTheyStand) {
+    const TempFolder folder;
+    const std::string name = folder.file("dump.raw");
+    Dump dump({{"filename", name.c_str()}});
+    std::string all;
+    for (const unsigned fourcc : {QvFourcc::I422, QvFourcc::BGR3}) {
+        QvFrame in = makePicture(fourcc, 7, 5, fourcc);
+        EXPECT_EQ(samplesOf(dump.through(in)), samplesOf(in));
+        EXPECT_EQ(dump.apply(in), 0);
+        all += pictureBytes(in) + pictureBytes(in);
+    }
+    EXPECT_EQ(dump.close(), 0);
+    EXPECT_EQ(TempFolder::read(name), all);
+    EXPECT_EQ(dump.open(), 0);
+    EXPECT_EQ(dump.close(), 0);
+    EXPECT_EQ(TempFolder::read(name), "") << "made anew";
+}
+
+TEST(DumpRaw, FilesThatCanNotBeWritten) {
+    const TempFolder folder;
+    for (const std::string& name : {std::string("set me"), folder.file("no/where"), folder.path().string()}) {
+        DumpRaw dump;
+        dump.init();
+        EXPECT_EQ(dump.getParam("filename"), Any("set me"));
+        dump.setParam("filename", name.c_str());
+        const LogCapture log;
+        EXPECT_EQ(dump.open(), -1);
+        EXPECT_TRUE(log.contains("Raw dumper, failed to open " + name + ", exiting."));
+        QvFrame frame = makePicture(QvFourcc::GRAY, 8, 8);
+        EXPECT_EQ(dump.write(frame), -18);
+    }
+    const std::string name = folder.file("full.raw");
+    FullDisc disc(100000);
+    const PlatformScope scope(disc);
+    Dump dump({{"filename", name.c_str()}});
+    QvFrame frame = makePicture(QvFourcc::GRAY, 256, 256);
+    EXPECT_EQ(dump.write(frame), 0);
+    const LogCapture log;
+    EXPECT_EQ(dump.write(frame), -1);
+    EXPECT_EQ(dump.ready(), 1) << "the frame passes";
+    EXPECT_EQ(dump.apply(frame), 0) << "it was told once";
+    EXPECT_EQ(log.count("fail to write to " + name), 2) << "in both logs";
+    EXPECT_EQ(dump.close(), -1);
+    EXPECT_EQ(dump.open(), 0);
+    EXPECT_EQ(dump.close(), 0);
+}
+
+TEST(UserData, EachFrameIsShownOnceAndMayBeChanged) {
+    Seen seen;
+    const auto function = pointer(reinterpret_cast<void*>(&countFrames));
+    Callback filter({{"context", pointer(&seen)}, {"callback", function}});
+    QvFrame in = makePicture(QvFourcc::YUYV, 8, 4);
+    in.frameNr = 12;
+    EXPECT_EQ(filter.through(in).plane()[0], 77);
+    EXPECT_EQ(seen.frames, 1);
+    EXPECT_EQ(seen.last, 12);
+    EXPECT_EQ(filter.apply(in), 0);
+    EXPECT_EQ(in.plane()[0], 77);
+    EXPECT_EQ(seen.frames, 2);
+    // A filter that is restored calls the same function, as the chain of a job does.
+    AnyDict stored;
+    filter.store(stored);
+    Callback restored;
+    QvFrame before = makePicture(QvFourcc::YUYV, 8, 4, 3);
+    EXPECT_EQ(samplesOf(restored.through(before)), samplesOf(before)) << "no function yet";
+    EXPECT_EQ(restored.restore(stored), 0);
+    EXPECT_EQ(restored.apply(before), 0);
+    EXPECT_EQ(seen.frames, 3);
+    for (const Any& hostile :
+         {Any(static_cast<const void*>("\1\2\3\4\5\6\7"), 8), Any(123456), Any("text")}) {
+        EXPECT_NE(filter.setParam("callback", hostile), 0);
+        AnyDict state = stored;
+        state.set("state", AnyDict("callback", hostile));
+        EXPECT_NE(filter.restore(state), 0);
+    }
+    EXPECT_EQ(filter.setParam("callback", Any()), 0);
+    EXPECT_EQ(filter.apply(in), 0);
+    EXPECT_EQ(seen.frames, 3);
+}
