@@ -114,8 +114,13 @@ void Job::chooseOutput() {
 
 void Job::openInputs() {
     if (options_.inputs.empty()) throw Failure(Exit::usage, "no input; give a file or testgen:...");
+    // Beside a raw file there may be others, such as its sound.
+    const bool onlyOne = options_.inputs.size() == 1;
+    const auto isRaw = [&](const auto& name) { return onlyOne || !Source::describesItself(name); };
+    if (!options_.raw.empty() && std::none_of(options_.inputs.begin(), options_.inputs.end(), isRaw))
+        throw Failure(Exit::usage, "--raw describes a raw file; no input is one");
     for (const auto& name : options_.inputs) {
-        sources_.push_back(std::make_unique<Source>(name, options_.raw));
+        sources_.push_back(std::make_unique<Source>(name, isRaw(name) ? options_.raw : ""));
         sources_.back()->selectAll();
     }
     checkDamage();
@@ -198,8 +203,12 @@ MediaTime Job::endOf(const JobStream& stream) {
 }
 
 void Job::planPoints() {
+    const auto picture = std::find_if(streams_.begin(), streams_.end(),
+                                      [](const JobStream& stream) { return stream.type == kVideo; });
     for (JobStream& stream : streams_) {
-        const auto rate = stream.source->frameRate();
+        // Frames beside a sound of its own file are those of the picture.
+        auto rate = stream.source->frameRate();
+        if (!rate && picture != streams_.end()) rate = picture->source->frameRate();
         const MediaTime length = endOf(stream);
         const std::string end =
             "the end of " + inQuotes(stream.source->name()) + " (" + formatTime(length.seconds()) + ")";
@@ -351,6 +360,10 @@ void Job::planFilters() {
         const auto filter = makeAnyCodec(name, type == kVideo ? kVideoFilter : kAudioFilter);
         const KeyValues keys(colon == std::string::npos ? "" : spec.substr(colon + 1), {}, option);
         for (const auto& [key, value] : keys.all()) setChecked(*filter, key, valueOf(value), option);
+        // Two frames of each interlaced one are made first, so that scaling and a further change of the rate
+        // work on whole pictures.
+        if (filter->getParam("_rateFactor").asInt32(1) > 1 && !keys.find("_front"))
+            filter->setParam("_front", 1);
         AnyDict stored;
         filter->store(stored);
         stored.set("_on", 1);

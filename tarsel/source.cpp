@@ -86,8 +86,14 @@ void setChecked(QvCodec& codec, const std::string& name, const Any& value, const
                                    (reason.empty() ? "" : " (" + inLine(reason) + ")"));
 }
 
+namespace {
+
+bool isGenerator(const std::string& spec) { return spec.rfind(kGenerator, 0) == 0 || spec == "testgen"; }
+
+}  // namespace
+
 Source::Source(const std::string& spec, const std::string& raw) : name_(spec) {
-    if (spec.rfind(kGenerator, 0) == 0 || spec == "testgen") {
+    if (isGenerator(spec)) {
         isFile_ = false;
         if (!raw.empty())
             throw Failure(Exit::usage, "--raw describes a file; " + inQuotes(spec) + " is none");
@@ -113,6 +119,12 @@ Source::Source(const std::string& spec, const std::string& raw) : name_(spec) {
         openFile();
     else
         openRaw(raw);
+}
+
+bool Source::describesItself(const std::string& spec) {
+    if (isGenerator(spec)) return true;
+    const Any ext = QvFile::getExt(Any(spec.c_str()), true);
+    return !qv_registry()->decoders(ext.asString()).empty();
 }
 
 void Source::refuse(const std::string& why) const {

@@ -14,6 +14,10 @@ class Source {
     // ("size=352x288,pixel=I420,rate=25"), empty to open by extension. Throws Failure.
     Source(const std::string& spec, const std::string& raw);
 
+    // Whether an input of this name needs no format from outside: the generator, or an extension with a
+    // decoder.
+    static bool describesItself(const std::string& spec);
+
     QvDecodePipe& decoder() const { return *decoder_; }
     const std::string& name() const { return name_; }
     // Bytes of the file; negative when it is none.

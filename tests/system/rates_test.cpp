@@ -1,0 +1,86 @@
+// Changes of the frame rate, from a file to a file: which frames come out, and the sound beside them.
+#include "tests/system/tool.h"
+
+namespace {
+
+class Rates : public Tool {
+  protected:
+    // `count` frames, all bytes of the i-th being i.
+    void makeCounted(const std::string& name, int count) const {
+        std::string bytes;
+        for (int i = 0; i < count; ++i) bytes.append(kFrame, static_cast<char>(i));
+        folder.write(name, bytes);
+    }
+    // What rows 0 and 1 of each frame show: "3" when they agree, else "3/4". The first `most` of them.
+    std::string shown(const std::string& name, std::size_t most) const {
+        const std::string bytes = contents(name);
+        std::string text;
+        for (std::size_t n = 0; n < most && (n + 1) * kFrame <= bytes.size(); ++n) {
+            const int even = static_cast<unsigned char>(bytes[n * kFrame]);
+            const int odd = static_cast<unsigned char>(bytes[n * kFrame + 64]);
+            text += (n ? " " : "") + std::to_string(even) + (even == odd ? "" : "/" + std::to_string(odd));
+        }
+        return text;
+    }
+};
+
+TEST_F(Rates, FramesAndSamplesAreCountedAndRight) {
+    const struct {
+        int frames;
+        const char *in, *out;
+        std::vector<std::string> more;
+        long long written, samples;
+        const char* first;
+    } rows[] = {
+        {100, "25", "50", {}, 200, 176400, "0 0 1 1 2 2"},
+        {100, "50", "25", {}, 50, 88200, "0 2 4 6 8 10"},
+        {100, "50", "25", {"--from", "10f", "--to", "50f"}, 20, 35280, "10 12 14 16 18 20"},
+        {99, "50", "25", {}, 50, 87318, "0 2 4 6 8 10"},
+        {99, "50", "25i", {}, 50, 87318, "0/1 2/3 4/5 6/7 8/9 10/11"},
+        {100, "50", "25", {"--from", "11f"}, 45, 78498, "12 14 16 18 20 22"},
+        {96, "24", "30i", {}, 120, 176400, "0 0/1 1/2 2 3 4 4/5"},
+        {96, "24000/1001", "30000/1001i", {}, 120, 176576, "0 0/1 1/2 2 3 4 4/5"},
+        {96, "24", "30000/1001i", {}, 119, 175104, "0 0/1 1/2 2 3 4 4/5"},
+        {100, "25", "30000/1001", {}, 119, 175104, "0 0 1 2 3 4"},
+        {100, "25i", "50", {"--filter", "bobber"}, 200, 176400, "0 0 1 1 2 2"},
+        {100, "25i", "50", {"--filter", "bobber:alpha=0,_front=1", "--size", "32x24"}, 200, 176400, ""},
+        {100, "25i", "30000/1001", {"--filter", "bobber"}, 119, 175104, "0 0 1 2 3 4"},
+        {100, "50", "24", {}, 48, 88200, "0 2 4 6 8 10"},
+    };
+    for (const auto& row : rows) {
+        makeCounted("in.yuv", row.frames);
+        const bool isInterlaced = std::string(row.in).back() == 'i';
+        const std::string rate(row.in, std::strlen(row.in) - (isInterlaced ? 1 : 0));
+        double fps = std::stod(rate);
+        if (rate.find('/') != std::string::npos) fps /= 1001;
+        const std::string sound =
+            contents(makeWav("in.wav", static_cast<unsigned>(row.frames / fps * 44100)));
+        std::vector<std::string> arguments = {
+            "transcode",
+            "in.yuv",
+            "in.wav",
+            "--raw",
+            "size=64x48,pixel=I420,rate=" + rate + (isInterlaced ? ",interlaced=1" : ""),
+            "--rate",
+            row.out,
+            "-o",
+            "o.raw",
+            "-y"};
+        arguments.insert(arguments.end(), row.more.begin(), row.more.end());
+        const std::string what = std::string(row.in) + " to " + row.out;
+        works(arguments);
+        const bool isSmall = *row.first == 0;
+        EXPECT_EQ(size("o.raw"), row.written * static_cast<long long>(isSmall ? kFrame / 4 : kFrame)) << what;
+        const auto seen =
+            static_cast<std::size_t>(std::count(row.first, row.first + std::strlen(row.first), ' '));
+        EXPECT_EQ(isSmall ? row.first : shown("o.raw", seen + 1), row.first) << what;
+        const std::string out = wavPart(contents("o.wav"), "data");
+        EXPECT_EQ(static_cast<long long>(out.size()), row.samples * 4) << what;
+        const std::string all = wavPart(sound, "data");
+        EXPECT_TRUE(row.more.empty() || row.more[0] != "--from" ? all.compare(0, out.size(), out) == 0
+                                                                : all.find(out) != std::string::npos)
+            << what;
+    }
+}
+
+}  // namespace
