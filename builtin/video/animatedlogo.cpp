@@ -1,7 +1,9 @@
 #include "builtin/video/animatedlogo.h"
 
 #include <algorithm>
+#include <charconv>
 #include <cmath>
+#include <string_view>
 
 #include "builtin/creators.h"
 #include "core/decode/decodefactory.h"
@@ -18,12 +20,46 @@ constexpr int mostOffset = 1 << 20;
 constexpr int videoFilterInterface = 12;
 constexpr int leastSide = 4;
 
+// A whole number as such, anything else as text.
+Any valueOf(std::string_view text) {
+    int number = 0;
+    const auto [rest, error] = std::from_chars(text.data(), text.data() + text.size(), number);
+    if (error == std::errc() && rest == text.data() + text.size()) return number;
+    return std::string(text).c_str();
+}
+
+// "FOURCC=BGRA;width=64" as a dictionary. False: it is not of that form.
+bool parse(std::string_view text, AnyDict& dict) {
+    while (!text.empty()) {
+        const std::string_view pair = text.substr(0, text.find(';'));
+        text.remove_prefix(std::min(pair.size() + 1, text.size()));
+        const size_t equals = pair.find('=');
+        if (equals == 0 || equals == std::string_view::npos || equals > AnyDict::maxKeyLength) return false;
+        dict.set(std::string(pair.substr(0, equals)).c_str(), valueOf(pair.substr(equals + 1)));
+    }
+    return true;
+}
+
+int setDecoderParams(Settings& settings, const Any& value) {
+    AnyDict params;
+    std::string text;
+    if (value.isDict())
+        params = value.asDict();
+    else if (!value.isText() || !qvparam::convert(value, text) || !parse(text, params))
+        return QvStatus::invalidParam;
+    settings.decoderParams = params;
+    return QvStatus::ok;
+}
+
+void getDecoderParams(const Settings& settings, Any& value) { value = settings.decoderParams; }
+
 constexpr QvParamRow<Settings> rows[] = {
     {.name = "filename",
      .member = &Settings::filename,
      .flags = qvParamStored,
      .description = "Movie with logo"},
-    {"decoderParams", &Settings::decoderParams, qvParamStored},
+    {"decoder", &Settings::decoder, qvParamStored},
+    {"decoderParams", QvParamAccess<Settings>{setDecoderParams, getDecoderParams}, qvParamStored},
     {"xpos", &Settings::x, qvParamStored, -mostOffset, mostOffset, "x offset (negative for right alignment)"},
     {"ypos", &Settings::y, qvParamStored, -mostOffset, mostOffset,
      "y offset (negative for bottom alignment)"},
@@ -77,8 +113,14 @@ int AnimatedLogo::open() {
 int AnimatedLogo::openMovie() {
     const char* name = settings_.filename.c_str();
     if (settings_.filename.empty()) return setError(QvStatus::failed, "'filename' names no movie");
-    movie_.reset(QvDecFactory::decodePipe(Any(name)));
-    if (!movie_) return setError(QvStatus::failed, "The logo movie %s can't be opened", name);
+    const std::string& decoder = settings_.decoder;
+    if (decoder.empty())
+        movie_.reset(QvDecFactory::decodePipe(Any(name)));
+    else if (qv_registry()->module(decoder.c_str()))
+        movie_.reset(QvDecFactory::decodePipeUsing(Any(name), AnyVector(Any(decoder.c_str()))));
+    if (!movie_)
+        return setError(QvStatus::failed, "The logo movie %s can't be opened by %s", name,
+                        decoder.empty() ? "its extension; 'decoder' may name a module" : decoder.c_str());
     if (movie_->nrStreams(qvVideoStream) == 0) {
         qv_dbg()->error("[animated logo] no video streams in file %s", name);
         return setError(QvStatus::failed, "The logo movie %s has no picture", name);

@@ -2,8 +2,10 @@
 //
 // Parameters:
 //
-//     "filename"            the movie, opened by its extension
-//     "decoderParams" Dict  set on its open decoder: the format of a raw file, for instance
+//     "filename"            the movie
+//     "decoder"             the module that opens it; empty: its extension tells
+//     "decoderParams" Dict  set on the open decoder, as the format of a raw file; as text, with ";" between:
+//                           FOURCC=BGRA;width=64;height=64
 //     "xpos", "ypos"   0    as of the module "logo": pixels from the left and top, or, negative, from the
 //     right
 //                           and lower edges to those of the frame
@@ -26,7 +28,7 @@
 class QvDecodePipe;
 
 struct AnimatedLogoSettings {
-    std::string filename;
+    std::string filename, decoder;
     AnyDict decoderParams;
     int x = 0, y = 0;
     double alpha = 1, scale = 100;
