@@ -1,23 +1,16 @@
 #include "builtin/pipes/audiopipe.h"
 
-#include <gtest/gtest.h>
-
 #include <memory>
 
-#include "core/engine/qvexception.h"
-#include "core/engine/status.h"
+#include "tests/support/checks.h"
 #include "tests/support/fake_filters.h"
 #include "tests/support/fake_streams.h"
-#include "tests/support/log_capture.h"
 
 namespace {
 
-class Named : public FakeAudioFilter {
-  public:
+struct Named : FakeAudioFilter {
     explicit Named(const char* name) : name_(name) {}
     const char* name() const override { return name_; }
-
-  private:
     const char* name_;
 };
 
@@ -32,6 +25,13 @@ struct Pipe : QvAf {
         at(i).setParam("outSamplerate", out);
         at(i).ratio = static_cast<double>(out) / in;
     }
+    // Takes n samples off the front and returns the first channel's values.
+    std::vector<int> take(int n) {
+        std::vector<int> values;
+        for (int i = 0; i < n; ++i) values.push_back(*reinterpret_cast<const short*>(pcm()->ptr(i)));
+        erase(n);
+        return values;
+    }
 };
 
 struct Source : FakeDecoder {
@@ -40,14 +40,6 @@ struct Source : FakeDecoder {
     }
 };
 
-// Takes n samples off the front and returns the first channel's values.
-std::vector<int> take(QvAf& pipe, int n) {
-    std::vector<int> values;
-    for (int i = 0; i < n; ++i) values.push_back(*reinterpret_cast<const short*>(pipe.pcm()->ptr(i)));
-    pipe.erase(n);
-    return values;
-}
-
 TEST(AudioPipe, GivesWhatIsAskedFor) {
     Source decoder(10000);
     Pipe pipe({"a", "b"});
@@ -55,11 +47,10 @@ TEST(AudioPipe, GivesWhatIsAskedFor) {
     EXPECT_EQ(pipe.process(&decoder, 0, 1000), 0);
     EXPECT_EQ(pipe.samples(), 1000);
     EXPECT_EQ(pipe.process(&decoder, 0, 800), 0);
-    EXPECT_EQ(decoder.requests, std::vector<int>{1000});
-    EXPECT_EQ(take(pipe, 700).back(), 700);
+    EXPECT_EQ(pipe.take(700).back(), 700);
     EXPECT_EQ(pipe.process(&decoder, 0, 900), 0);
-    EXPECT_EQ(decoder.requests.back(), 600);
-    const auto values = take(pipe, 900);
+    EXPECT_EQ(decoder.requests, (std::vector<int>{1000, 600}));
+    const auto values = pipe.take(900);
     EXPECT_EQ(values.front(), 701);
     EXPECT_EQ(values.back(), 1600 - 1000);  // values start again after 1000
     EXPECT_EQ(pipe.samplesIn(), 1600);
@@ -68,84 +59,58 @@ TEST(AudioPipe, GivesWhatIsAskedFor) {
     EXPECT_EQ(pipe.samples(), 0);
 }
 
-TEST(AudioPipe, EndsWithSilenceAndSaysSo) {
-    Source decoder(600);
-    Pipe pipe({"a"});
-    ASSERT_EQ(pipe.open(), 0);
-    EXPECT_EQ(pipe.process(&decoder, 0, 1000), QvStatus::endOfStream);
-    ASSERT_EQ(pipe.samples(), 1000);
-    const auto values = take(pipe, 1000);
-    EXPECT_EQ(values[599], 600);
-    EXPECT_EQ(values[600], 0);
-    EXPECT_EQ(values[999], 0);
-    EXPECT_EQ(pipe.samplesIn(), 1000);
-}
-
-TEST(AudioPipe, SilenceFlushesWhatAFilterHoldsBack) {
-    Source decoder(600);
-    Pipe pipe({"a", "b"});
-    pipe.at(0).holdBack = 100;
-    ASSERT_EQ(pipe.open(), 0);
-    EXPECT_EQ(pipe.process(&decoder, 0, 600), QvStatus::endOfStream);
-    EXPECT_EQ(take(pipe, 600).back(), 600);
+TEST(AudioPipe, EndsWithSilenceThatFlushesTheFilters) {
+    for (const int holdBack : {0, 100}) {
+        Source decoder(600);
+        Pipe pipe({"a", "b"});
+        pipe.at(0).holdBack = holdBack;
+        ASSERT_EQ(pipe.open(), 0);
+        EXPECT_EQ(pipe.process(&decoder, 0, 1000), QvStatus::endOfStream);
+        ASSERT_EQ(pipe.samples(), 1000);
+        const auto values = pipe.take(1000);
+        EXPECT_EQ(values[599], 600);
+        EXPECT_EQ(values[600], 0);
+        EXPECT_EQ(values[999], 0);
+        EXPECT_EQ(pipe.samplesIn(), 1000 + holdBack);
+    }
 }
 
 TEST(AudioPipe, TheReadsFollowTheConvertersRatio) {
     Source decoder(100000, 44100);
     Pipe pipe({"a", "srconvert", "b"});
+    EXPECT_EQ(pipe.open(), -1);
+    EXPECT_STREQ(pipe.errorDesc(), "invalid samplerates (==0)");
     pipe.converter(1, 44100, 48000);
     ASSERT_EQ(pipe.open(), 0);
     EXPECT_EQ(pipe.process(&decoder, 0, 1920), 0);
-    EXPECT_EQ(decoder.requests.front(), 1764);
     EXPECT_EQ(pipe.at(1).getParam("splsToGet"), Any(1920));
     EXPECT_EQ(pipe.samples(), 1920);
     EXPECT_EQ(pipe.process(&decoder, 0, 1922), 0);
-    EXPECT_EQ(decoder.requests.back(), 16);  // never less
+    EXPECT_EQ(decoder.requests, (std::vector<int>{1764, 16}));  // never less
     EXPECT_EQ(pipe.at(1).getParam("splsToGet"), Any(16));
 }
 
-TEST(AudioPipe, RatesOfZeroDoNotOpen) {
-    Pipe pipe({"srconvert"});
-    EXPECT_EQ(pipe.open(), -1);
-    EXPECT_STREQ(pipe.errorDesc(), "invalid samplerates (==0)");
-    pipe.converter(0, 48000, 44100);
-    EXPECT_EQ(pipe.open(), 0);
-}
-
 TEST(AudioPipe, ErrorsComeOutAtOnce) {
-    {
-        Source decoder(600);
-        Pipe pipe({"a", "b"});
-        pipe.at(1).writeResult = -9;
+    const struct {
+        const char* what;
+        std::initializer_list<const char*> filters;
+        int samples;  // -1: no source
+        void (*arrange)(Pipe&);
+        int result;
+    } rows[] = {
+        {"a filter's error", {"a", "b"}, 600, [](Pipe& p) { p.at(1).writeResult = -9; }, -9},
+        {"no format to make silence of", {"a"}, 0, [](Pipe&) {}, -1},
+        {"no filter", {}, 600, [](Pipe&) {}, QvStatus::illegalState},
+        {"no source", {"a"}, -1, [](Pipe&) {}, QvStatus::endOfStream},
+        {"a filter gives nothing", {"a", "b"}, 600, [](Pipe& p) { p.at(1).swallows = true; }, -1},
+    };
+    for (const auto& row : rows) {
+        Source decoder(row.samples);
+        Pipe pipe(row.filters);
+        row.arrange(pipe);
         ASSERT_EQ(pipe.open(), 0);
-        EXPECT_EQ(pipe.process(&decoder, 0, 100), -9);
+        EXPECT_EQ(pipe.process(row.samples < 0 ? nullptr : &decoder, 0, 100), row.result) << row.what;
     }
-    {
-        Source decoder(0);
-        Pipe pipe({"a"});
-        ASSERT_EQ(pipe.open(), 0);
-        EXPECT_EQ(pipe.process(&decoder, 0, 100), -1) << "no format to make silence of";
-    }
-    {
-        Source decoder(600);
-        Pipe pipe({});
-        ASSERT_EQ(pipe.open(), 0);
-        EXPECT_LT(pipe.process(&decoder, 0, 100), 0);
-    }
-    {
-        Pipe pipe({"a"});
-        ASSERT_EQ(pipe.open(), 0);
-        EXPECT_EQ(pipe.process(nullptr, 0, 100), QvStatus::endOfStream);
-    }
-}
-
-TEST(AudioPipe, AFilterThatGivesNothingDoesNotHang) {
-    Source decoder(600);
-    Pipe pipe({"a", "b"});
-    pipe.at(1).swallows = true;
-    ASSERT_EQ(pipe.open(), 0);
-    EXPECT_EQ(pipe.process(&decoder, 0, 100), -1);
-    EXPECT_STREQ(pipe.errorDesc(), "the audio filters give no samples");
 }
 
 TEST(AudioPipe, PositionsAndNames) {

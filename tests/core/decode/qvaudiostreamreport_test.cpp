@@ -1,14 +1,11 @@
 #include "core/decode/qvaudiostreamreport.h"
 
-#include <gtest/gtest.h>
-
 #include <cmath>
 #include <cstring>
 #include <limits>
-#include <string>
 
-#include "core/engine/qvexception.h"
 #include "core/media/qvbuffer.h"
+#include "tests/support/checks.h"
 
 namespace {
 
@@ -46,11 +43,8 @@ TEST(AudioStreamReport, PeaksOfEachWidthHaveOneScale) {
 TEST(AudioStreamReport, RangesAreOfSamplesAndClamped) {
     QvAudioStreamReport report;
     report.init(4000, 2, 48000, 16);
-    for (const char* level : {"\x64\0", "\0\x40", "\x0A\0"}) {
-        std::string bytes;
-        for (int i = 0; i < 3200; ++i) bytes.append(level, 2);
-        EXPECT_EQ(report.processGroup(pcmOf(2, bytes)), 0);
-    }
+    for (const char* level : {"\x64\0", "\0\x40", "\x0A\0"})
+        EXPECT_EQ(report.processGroup(pcmOf(2, repeated({level, 2}, 3200))), 0);
     EXPECT_EQ(report.processGroup(pcmOf(2, std::string(4, 0))), -1) << "behind the last group";
     EXPECT_NEAR(report.peakdB(0, 1599), 20 * std::log10(100 / 32768.0), 1e-9);
     EXPECT_NEAR(report.peakdB(0, 1600), -6.0206, 1e-4);

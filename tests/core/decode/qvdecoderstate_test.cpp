@@ -1,25 +1,22 @@
 #include "core/decode/qvdecoderstate.h"
 
-#include <gtest/gtest.h>
-
 #include <chrono>
 #include <filesystem>
 #include <fstream>
 #include <functional>
 #include <set>
-#include <string>
 
-#include "core/engine/init.h"
 #include "core/engine/qvlog.h"
+#include "tests/support/checks.h"
 #include "tests/support/temp_folder.h"
+#include "tests/support/wav_bytes.h"
 
 namespace {
 
 namespace fs = std::filesystem;
 
 Any block(int bytes) {
-    std::string text(static_cast<std::size_t>(bytes), 0);
-    for (int i = 0; i < bytes; ++i) text[static_cast<std::size_t>(i)] = static_cast<char>(i * 13);
+    const std::string text = patternBytes(static_cast<std::size_t>(bytes));
     return Any(static_cast<const void*>(text.data()), bytes);
 }
 
@@ -47,14 +44,9 @@ class DecoderState : public testing::Test {
 };
 
 QvDecoderState sample() {
-    QvDecoderState state;
-    state.set("frames", Any(250));
-    state.set("length", Any(1LL << 40));
-    state.set("note", Any(std::string(500, 'n').c_str()));
-    state.set("small", block(128));
-    state.set("my_index", block(129));
-    state.set("rates", AnyVector(25.0, "x"));
-    return state;
+    return QvDecoderState(AnyDict("frames", 250, "length", 1LL << 40, "note", repeated("n", 500).c_str(),
+                                  "small", block(128), "my_index", block(129), "rates",
+                                  AnyVector(25.0, "x")));
 }
 
 TEST_F(DecoderState, EverythingComesBack) {
@@ -74,23 +66,20 @@ TEST_F(DecoderState, EverythingComesBack) {
     EXPECT_EQ(later.restoreState("/no/such/file", again), -1);
 }
 
-TEST_F(DecoderState, StoringAgainReplaces) {
+TEST_F(DecoderState, StoringAgainReplacesAndAChangedFileVoidsIt) {
     ASSERT_EQ(manager.storeState(file, sample()), 0);
     ASSERT_EQ(manager.storeState(file, QvDecoderState(AnyDict("only", 1))), 0);
     EXPECT_FALSE(fs::exists(kept() / "my_index.dat"));
     QvDecoderState again;
     ASSERT_EQ(manager.restoreState(file, again), 0);
     EXPECT_EQ(again.size(), 1);
-    EXPECT_EQ(manager.deleteState(file), 0);
-    EXPECT_FALSE(manager.stateStored(file));
-}
-
-TEST_F(DecoderState, AChangedFileVoidsItsState) {
-    ASSERT_EQ(manager.storeState(file, sample()), 0);
     const fs::path path = file.asString();
     fs::last_write_time(path, fs::last_write_time(path) + std::chrono::seconds(10));
     EXPECT_FALSE(manager.stateStored(file));
     EXPECT_TRUE(kept().empty()) << "and removes it";
+    ASSERT_EQ(manager.storeState(file, sample()), 0);
+    EXPECT_EQ(manager.deleteState(file), 0);
+    EXPECT_FALSE(manager.stateStored(file));
 }
 
 TEST_F(DecoderState, DamageCountsAsNotStored) {
@@ -132,12 +121,6 @@ TEST_F(DecoderState, NamesOfKeysNeverBecomePaths) {
     EXPECT_TRUE(again["a_name_that_leaves_no_room_for_a_prefix"] == block(300));
 }
 
-TEST_F(DecoderState, WhatCanNotBeWrittenLeavesNothing) {
-    fs::remove_all(folder.path() / "index");
-    EXPECT_EQ(manager.storeState(file, sample()), -1);
-    EXPECT_FALSE(manager.stateStored(file));
-}
-
 TEST_F(DecoderState, ClearingTakesOnlyWhatItMade) {
     ASSERT_EQ(manager.storeState(file, sample()), 0);
     const fs::path root = folder.path() / "index";
@@ -154,6 +137,9 @@ TEST_F(DecoderState, ClearingTakesOnlyWhatItMade) {
 }
 
 TEST_F(DecoderState, WithoutAFolderNothingIsKept) {
+    fs::remove_all(folder.path() / "index");
+    EXPECT_EQ(manager.storeState(file, sample()), -1);
+    EXPECT_FALSE(manager.stateStored(file));
     folder.write("plain", "");
     qv_log()->clear();
     QvDecoderStateManager none("index", Any(folder.file("plain").c_str()));

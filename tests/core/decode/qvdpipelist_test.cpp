@@ -1,9 +1,7 @@
 #include "core/decode/qvdpipelist.h"
 
-#include <gtest/gtest.h>
-
-#include "core/engine/qvexception.h"
 #include "tests/core/decode/fake_decoder.h"
+#include "tests/support/checks.h"
 
 namespace {
 
@@ -18,12 +16,11 @@ class Counted : public FakeDecoder {
         ++closed;
         return FakeDecoder::close();
     }
-    static inline int gone = 0;
-    static inline int closed = 0;
+    static inline int gone = 0, closed = 0;
 };
 
 TEST(DPipeList, FindsByNameBehindAnother) {
-    Counted a("a"), b("b"), c("a"), foreign("a");
+    Counted a("a"), b("b"), c("a"), foreign("a"), unnamed(nullptr);
     QvDPipeList list;
     for (QvDecodePipe* decoder : {&a, &b, &c}) list.append(decoder);
     EXPECT_EQ(list.findByFilename("a", nullptr), &a);
@@ -31,18 +28,15 @@ TEST(DPipeList, FindsByNameBehindAnother) {
     EXPECT_EQ(list.findByFilename("a", &c), nullptr);
     EXPECT_EQ(list.findByFilename("x", nullptr), nullptr);
     EXPECT_THROW(list.findByFilename("a", &foreign), QvAssertFailure);
-    Counted unnamed(nullptr);
     list.append(&unnamed);
     EXPECT_THROW(list.findByFilename("x", nullptr), QvAssertFailure);
 }
 
 TEST(DPipeList, DeletesEachDecoderOnce) {
     QvDPipeList list;
-    auto* twice = new Counted("a");
-    for (QvDecodePipe* decoder :
-         {static_cast<QvDecodePipe*>(twice), static_cast<QvDecodePipe*>(new Counted("b")),
-          static_cast<QvDecodePipe*>(twice)})
-        list.append(decoder);
+    QvDecodePipe* const twice = new Counted("a");
+    QvDecodePipe* const once = new Counted("b");
+    for (QvDecodePipe* decoder : {twice, once, twice}) list.append(decoder);
     Counted::gone = Counted::closed = 0;
     list.deleteAll();
     EXPECT_EQ(Counted::gone, 2);

@@ -1,8 +1,6 @@
 #include "core/encode/basemuxer.h"
 
-#include <gtest/gtest.h>
-
-#include "core/engine/qvexception.h"
+#include "tests/support/checks.h"
 #include "tests/support/test_stream.h"
 
 namespace {
@@ -27,19 +25,17 @@ TEST(BaseMuxer, KeepsOneListForEachType) {
     {
         Muxer muxer;
         EXPECT_FALSE(muxer.anyEnabled());
-        auto* v0 = muxer.addStream(1, AnyDict());
+        muxer.addStream(1, AnyDict());
         auto* v1 = muxer.addStream(1, AnyDict());
-        auto* a0 = muxer.addStream(2, AnyDict());
+        muxer.addStream(2, AnyDict());
         muxer.addStream(4, AnyDict());
         for (const auto& [type, count] : {std::pair(0, 4), {255, 4}, {1, 2}, {2, 1}, {4, 1}, {3, 0}, {-1, 0}})
             EXPECT_EQ(muxer.nrStreams(type), count) << type;
         EXPECT_EQ(muxer.stream(1, 1), v1);
         for (const auto& [type, nr] : {std::pair(1, 2), {1, -1}, {2, 1}, {3, 0}})
             EXPECT_THROW(muxer.stream(type, nr), QvAssertFailure) << type;
-
         muxer.removeStream(1, 0);
         EXPECT_EQ(muxer.stream(1, 0), v1);
-        EXPECT_NE(v0, v1);
         EXPECT_THROW(muxer.removeStream(1, 1), QvAssertFailure);
         v1->setEnabled(false);
         EXPECT_TRUE(muxer.anyEnabled());
@@ -49,8 +45,7 @@ TEST(BaseMuxer, KeepsOneListForEachType) {
         EXPECT_EQ(Muxer::Counted::alive, 1);
         muxer.removeStreams(255);
         EXPECT_EQ(Muxer::Counted::alive, 0);
-        a0 = muxer.addStream(2, AnyDict());
-        EXPECT_EQ(muxer.stream(2, 0), a0);
+        muxer.addStream(2, AnyDict());
     }
     EXPECT_EQ(Muxer::Counted::alive, 0);
 }

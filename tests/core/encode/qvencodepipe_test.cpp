@@ -1,39 +1,31 @@
 #include "core/encode/qvencodepipe.h"
 
-#include <gtest/gtest.h>
-
-#include <memory>
-
-#include "core/engine/qvexception.h"
 #include "core/filter/filtersstate.h"
 #include "core/media/qvgeometry.h"
+#include "tests/support/checks.h"
 #include "tests/support/failing_codecs.h"
 #include "tests/support/log_capture.h"
 
 namespace {
 
-class Pipe : public testing::Test {
-  protected:
-    void limits(int videos, int audios, int subpics, int total) {
-        outputs_.params.set("rawmux.maxStreams",
-                            AnyDict("vids", videos, "auds", audios, "subs", subpics, "total", total));
-    }
-
+struct Pipe : testing::Test {
     FailingOutputs outputs_;
     std::unique_ptr<QvEncodePipe> pipe_{QvEncodePipe::create()};
 };
 
 // The pipe has one stream of each kind.
 TEST_F(Pipe, RoomForStreams) {
-    struct Row {
+    const struct {
         int videos, audios, subpics, total;
         int forVideo, forAudio, forSubpic, forAny;
-    };
-    for (const auto& row : {Row{0, 1, 0, 9, -1, 0, -1, 7}, Row{2, 4, 1, 9, 1, 3, 1, 7},
-                            Row{9, 9, 0, 2, 0, 0, -1, 0}, Row{1, 1, 9, 2, 0, 0, 0, 0}}) {
-        SCOPED_TRACE(testing::Message()
-                     << row.videos << " " << row.audios << " " << row.subpics << " " << row.total);
-        limits(row.videos, row.audios, row.subpics, row.total);
+    } rows[] = {{0, 1, 0, 9, -1, 0, -1, 7},
+                {2, 4, 1, 9, 1, 3, 1, 7},
+                {9, 9, 0, 2, 0, 0, -1, 0},
+                {1, 1, 9, 2, 0, 0, 0, 0}};
+    for (const auto& row : rows) {
+        SCOPED_TRACE(&row - rows);
+        outputs_.params.set("rawmux.maxStreams", AnyDict("vids", row.videos, "auds", row.audios, "subs",
+                                                         row.subpics, "total", row.total));
         EXPECT_EQ(pipe_->canAddStreams(qvVideoStream), row.forVideo);
         EXPECT_EQ(pipe_->canAddStreams(qvAudioStream), row.forAudio);
         EXPECT_EQ(pipe_->canAddStreams(qvSubpicStream), row.forSubpic);
@@ -58,9 +50,7 @@ TEST_F(Pipe, RoomForStreams) {
 }
 
 TEST_F(Pipe, WhatIsNotThereIsNull) {
-    EXPECT_EQ(pipe_->programSetup(), nullptr);
-    EXPECT_FALSE(pipe_->programsSupported());
-    EXPECT_EQ(pipe_->outputQueue(), nullptr);
+    EXPECT_FALSE(pipe_->programSetup() || pipe_->programsSupported() || pipe_->outputQueue());
     for (const auto& [type, nr] : {std::pair(1, 1), {1, -1}, {2, 7}, {4, 0}, {3, 0}}) {
         EXPECT_EQ(pipe_->stream(type, nr), nullptr);
         EXPECT_EQ(pipe_->encoder(type, nr), nullptr);
@@ -73,6 +63,14 @@ TEST_F(Pipe, WhatIsNotThereIsNull) {
     EXPECT_EQ(pipe_->indexOf(&stranger), -1);
     EXPECT_EQ(pipe_->streamNr(&stranger), -1);
     EXPECT_FALSE(stranger.enabled());
+    pipe_->videoStream(0)->setEnabled(false);
+    EXPECT_FALSE(pipe_->videoStream(0)->enabled());
+    FiltersState filters;
+    filters.setFilter("cropper", AnyDict("name", "cropper", "_on", 1));
+    pipe_->setFilters(qvAudioStream, 0, filters);
+    EXPECT_EQ(pipe_->filters(qvAudioStream, 0), filters);
+    EXPECT_TRUE(pipe_->filters(qvVideoStream, 0).empty());
+    EXPECT_THROW(pipe_->filters(qvVideoStream, 1), QvAssertFailure);
 }
 
 TEST_F(Pipe, DescribesItsStreams) {
@@ -81,28 +79,15 @@ TEST_F(Pipe, DescribesItsStreams) {
     pipe_->getStreamDesc(qvVideoStream, 0, desc);
     ASSERT_EQ(desc.size(), 3);
     EXPECT_EQ(desc[0], "1280x720");
-    struct Row {
-        int channels;
-        const char* text;
-    };
-    for (const auto& row : {Row{1, "mono"}, Row{2, "stereo"}, Row{6, "multi ch."}}) {
-        pipe_->setParam("audio0", AnyDict("channels", row.channels, "samplerate", 44100));
+    for (const auto& [channels, text] : {std::pair(1, "mono"), {2, "stereo"}, {6, "multi ch."}}) {
+        pipe_->setParam("audio0", AnyDict("channels", channels, "samplerate", 44100));
         pipe_->getStreamDesc(qvAudioStream, 0, desc);
         ASSERT_EQ(desc.size(), 3);
         EXPECT_EQ(desc[0], "44100Hz");
-        EXPECT_EQ(desc[1], row.text);
+        EXPECT_EQ(desc[1], text);
     }
     pipe_->getStreamDesc(qvAudioStream, 1, desc);
     EXPECT_TRUE(desc.empty());
-}
-
-TEST_F(Pipe, KeepsTheFiltersOfEachStream) {
-    FiltersState filters;
-    filters.setFilter("cropper", AnyDict("name", "cropper", "_on", 1));
-    pipe_->setFilters(qvAudioStream, 0, filters);
-    EXPECT_EQ(pipe_->filters(qvAudioStream, 0), filters);
-    EXPECT_TRUE(pipe_->filters(qvVideoStream, 0).empty());
-    EXPECT_THROW(pipe_->filters(qvVideoStream, 1), QvAssertFailure);
 }
 
 }  // namespace

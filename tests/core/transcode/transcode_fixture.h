@@ -6,25 +6,14 @@
 #include <cstdio>
 #include <functional>
 #include <mutex>
-#include <string>
-#include <vector>
+#include <utility>
 
-#include "core/engine/qvexception.h"
 #include "core/transcode/qvtranscoder.h"
 #include "core/transcode/qvtranscodetask.h"
+#include "tests/support/checks.h"
+#include "tests/support/fake_muxer.h"
 #include "tests/support/fake_streams.h"
-
-// The text of the assertion that `work` ends with; "" if it ends well.
-template <class Work>
-std::string assertion(Work work) {
-    try {
-        work();
-    } catch (const QvAssertFailure& failure) {
-        const std::string text = failure.what();
-        return text.substr(text.rfind('\n') + 1);
-    }
-    return "";
-}
+#include "tests/support/log_capture.h"
 
 class Events {
   public:
@@ -74,8 +63,8 @@ class NotedPipe : public FakeEncodePipe {
     int close() override { return note("close", closeResult); }
     int abort() override { return note("abort", 0); }
     int writeFrame(QvFrame* frame, int stream) override {
-        if (quiet) return FakeEncodePipe::writeFrame(frame, stream);
-        return note("v" + std::to_string(frame->frameNr), FakeEncodePipe::writeFrame(frame, stream));
+        const int result = FakeEncodePipe::writeFrame(frame, stream);
+        return quiet ? result : note("v" + std::to_string(frame->frameNr), result);
     }
     void getParam(const char* name, Any& value) const override {
         if (std::string(name) == "filename")
@@ -111,8 +100,7 @@ class NotedTranscoder : public QvTranscoder {
     int cbProgress(double part) override {
         char text[16];
         std::snprintf(text, sizeof text, "%.2f", part);
-        events_.add(text);
-        return 0;
+        return events_.add(text), 0;
     }
     void cbPaused(bool paused) override { events_.add(paused ? "paused" : "resumed"); }
     int cbProcess() override {
@@ -122,10 +110,7 @@ class NotedTranscoder : public QvTranscoder {
     void cbPostprocess(const Any& command) override {
         events_.add(std::string("post:") + command.asString());
     }
-    int cbMuxClose(QvMuxer*) override {
-        events_.add("muxclose");
-        return 0;
-    }
+    int cbMuxClose(QvMuxer*) override { return events_.add("muxclose"), 0; }
 
     std::function<int()> onProcess;
     std::function<void()> onDone;
@@ -137,9 +122,11 @@ class NotedTranscoder : public QvTranscoder {
 
 // `frames` of 25 a second with 48 kHz sound. Sources, output and task outlive the transcoder.
 struct Job {
-    explicit Job(int frames = 2) : decoder(frames, QvFramerate::f25p()), pipe(events, QvFramerate::f25p()) {
+    explicit Job(int frames = 2, bool linked = false)
+        : decoder(frames, QvFramerate::f25p()), pipe(events, QvFramerate::f25p()) {
         decoder.audio(frames * 1920LL, 48000);
         task.setEncoder(&pipe);
+        if (linked) linkBoth();
     }
     void linkBoth() {
         ASSERT_EQ(task.link(&decoder, 1, 0, 0), 0);
@@ -150,4 +137,14 @@ struct Job {
     FakeDecoder decoder;
     NotedPipe pipe;
     QvTask task;
+};
+
+// A job with both links and its transcoder.
+struct LinkedJob : Job {
+    explicit LinkedJob(int frames = 2) : Job(frames, true) {}
+    void beQuiet() {  // no steps in the events
+        pipe.quiet = pipe.sound->quiet = true;
+        t.setParam("progress", AnyDict("off", 1));
+    }
+    NotedTranscoder t{events, &task};
 };

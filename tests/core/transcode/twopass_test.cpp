@@ -1,10 +1,5 @@
-#include <gtest/gtest.h>
-
-#include <memory>
-
 #include "tests/core/transcode/transcode_fixture.h"
 #include "tests/support/failing_codecs.h"
-#include "tests/support/log_capture.h"
 #include "tests/support/temp_folder.h"
 
 namespace {
@@ -23,10 +18,10 @@ struct TwoPass {
         task.setEncoder(pipe.get());
         EXPECT_EQ(task.link(&decoder, 1, 0, 0), 0) << task.errorDesc();
         outputs.watched = "rawvenc.meta";
-    }
-    int run(NotedTranscoder& t) {
         t.setParam("twoPass", 1);
         t.setParam("metaName", folder.file("stats").c_str());
+    }
+    int run() {
         outputs.calls.clear();
         const int result = t.transcode(true);
         for (const auto& call : outputs.calls)
@@ -42,22 +37,22 @@ struct TwoPass {
     QvTask task;
     Events events;
     std::string calls;
+    NotedTranscoder t{events, &task};
 };
 
 TEST(TwoPasses, TheFirstLeavesNothingButItsStatistics) {
     TwoPass job;
     job.task.setProcessParams(
         ProcessParams(AnyDict("inOutPoints", AnyVector(Any(MediaTime(0.04)), Any(MediaTime(0.12))))), 1);
-    NotedTranscoder t(job.events, &job.task);
-    t.setParam("progress", AnyDict("each", 1));
+    job.t.setParam("progress", AnyDict("each", 1));
     Any second;
     std::string passes;
-    t.onProcess = [&] {
-        t.getParam("secondPass", second);
+    job.t.onProcess = [&] {
+        job.t.getParam("secondPass", second);
         passes += second.isTrue() ? "2" : "1";
         return 0;
     };
-    EXPECT_EQ(job.run(t), 0);
+    EXPECT_EQ(job.run(), 0);
     EXPECT_EQ(job.calls, "meta=1 open write write close meta=1 open write write meta=0 close ");
     EXPECT_EQ(job.events.take(), "0.00 0.00 0.25 0.50 0.75 muxclose done0");
     EXPECT_EQ(passes, "1122");
@@ -85,28 +80,25 @@ TEST(TwoPasses, EveryFailureEndsTheRunAndForgetsTheStatistics) {
         TwoPass job;
         job.outputs.failAt = row.failAt;
         job.outputs.how = row.how;
-        NotedTranscoder t(job.events, &job.task);
-        EXPECT_LT(job.run(t), 0);
+        EXPECT_LT(job.run(), 0);
         EXPECT_EQ(job.calls, row.calls);
-        EXPECT_STREQ(t.errorDesc(), "Error in processing");
+        EXPECT_STREQ(job.t.errorDesc(), "Error in processing");
     }
 }
 
 TEST(TwoPasses, AStopInTheFirstPassIsNoFailure) {
-    TwoPass job;
-    NotedTranscoder t(job.events, &job.task);
-    t.onProcess = [] { return 1; };
-    EXPECT_EQ(job.run(t), 0);
-    EXPECT_EQ(job.calls, "meta=1 open write close meta=0 close ");
-    EXPECT_TRUE(job.events.take().ends_with("done1"));
+    TwoPass stopped;
+    stopped.t.onProcess = [] { return 1; };
+    EXPECT_EQ(stopped.run(), 0);
+    EXPECT_EQ(stopped.calls, "meta=1 open write close meta=0 close ");
+    EXPECT_TRUE(stopped.events.take().ends_with("done1"));
 }
 
 TEST(TwoPasses, WithoutAnEncoderForItOnePassIsRun) {
     TwoPass job;
     job.outputs.params.clear();
-    NotedTranscoder t(job.events, &job.task);
     LogCapture log;
-    EXPECT_EQ(job.run(t), 0);
+    EXPECT_EQ(job.run(), 0);
     EXPECT_TRUE(log.contains("Transcoder: Two pass encoding not possible, reverting to single pass.",
                              QvLogMask::warning));
     EXPECT_EQ(job.calls, "open write write write meta=0 close ");
