@@ -17,10 +17,12 @@ class QV_API AnyVector {
   public:
     AnyVector() noexcept = default;
     // One to eleven elements in order: AnyVector(1, "two", 3.0). One alone is explicit, so that an Any that
-    // holds a vector converts to that vector.
-    explicit AnyVector(const Any& first) { append(first); }
+    // holds a vector converts to that vector. They delegate, so that a failure half-way releases what is
+    // there.
+    explicit AnyVector(const Any& first) : AnyVector() { append(first); }
     template <class First, class... Rest>
-    requires(sizeof...(Rest) >= 1 && sizeof...(Rest) <= 10) AnyVector(First&& first, Rest&&... rest) {
+    requires(sizeof...(Rest) >= 1 && sizeof...(Rest) <= 10) AnyVector(First&& first, Rest&&... rest)
+        : AnyVector() {
         append(Any(std::forward<First>(first)));
         (append(Any(std::forward<Rest>(rest))), ...);
     }
@@ -150,7 +152,8 @@ class QV_API AnyDict {
     // One to eight pairs of key and value, set in the order given: AnyDict("type", 1, "name", "x").
     template <std::convertible_to<Any> Value, class... Rest>
     requires(sizeof...(Rest) % 2 == 0 && sizeof...(Rest) <= 14)
-        AnyDict(const char* key, Value&& value, Rest&&... rest) {
+        AnyDict(const char* key, Value&& value, Rest&&... rest)
+        : AnyDict() {
         setPairs(key, std::forward<Value>(value), std::forward<Rest>(rest)...);
     }
     AnyDict(const AnyDict& other);
