@@ -8,16 +8,16 @@
 #include "core/media/qvsoundbytes.h"
 #include "core/value/qvassert.h"
 
-bool SoundLoop::init(const QvPcm& sound, int length, long long total) {
+int SoundLoop::init(const QvPcm& sound, int length, long long total) {
     *this = SoundLoop();
-    if (sound_.init(length, sound.channels(), sound.bytesPerSample(), sound.samplerate()) != QvStatus::ok)
-        return false;
+    const int result = sound_.init(length, sound.channels(), sound.bytesPerSample(), sound.samplerate());
+    if (result != QvStatus::ok) return result;
     const int count = std::min(length, sound.samples());
     if (count > 0)
         std::memcpy(sound_.ptr(0), sound.ptr(0), static_cast<std::size_t>(sound_.samples2bytes(count)));
     length_ = length;
     total_ = total;
-    return true;
+    return QvStatus::ok;
 }
 
 void SoundLoop::seek(long long sample) {
@@ -53,7 +53,8 @@ int AudioGenerator::init(const AnyDict& dict) {
 
     const std::unique_ptr<const QvPcm> sound(QvSoundBytes::create(0));
     const int length = static_cast<int>(std::min<long long>(samples_, samplerate_));
-    if (!sound || !loop_.init(*sound, length, samples_)) return QvStatus::failed;
+    if (!sound) return QvStatus::failed;
+    if (const int result = loop_.init(*sound, length, samples_); result != QvStatus::ok) return result;
     return output_.init(samplerate_, channels_, bytesPerSample, samplerate_);
 }
 

@@ -8,8 +8,7 @@
 class SoundLoop {
   public:
     // At most `length` samples of the sound, then silence up to `length`; `total` is to be delivered.
-    // False when there is no memory.
-    bool init(const QvPcm& sound, int length, long long total);
+    int init(const QvPcm& sound, int length, long long total);
 
     long long left() const { return total_ - delivered_; }
     long long total() const { return total_; }

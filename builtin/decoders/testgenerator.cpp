@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cstring>
 #include <limits>
+#include <new>
 
 #include "builtin/creators.h"
 #include "core/engine/status.h"
@@ -15,6 +16,12 @@ bool is(const char* name, const char* other) { return std::strcmp(name, other) =
 int frameNumber(long long frame) {
     constexpr long long most = std::numeric_limits<int>::max();
     return static_cast<int>(std::clamp(frame, -most, most));
+}
+
+// A stream that can't be made of what is asked for is left out; one that only lacks the memory must not be.
+bool isUsable(int result) {
+    if (result == QvStatus::outOfMemory) throw std::bad_alloc();
+    return result == QvStatus::ok;
 }
 
 }  // namespace
@@ -76,12 +83,12 @@ void GeneratorPipe::makeStreams() {
         AnyDict dict = element.asDict();
         dict.set("mode", mode_);
         auto stream = std::make_unique<VideoGenerator>();
-        if (stream->init(dict) == QvStatus::ok) videos_.push_back(std::move(stream));
+        if (isUsable(stream->init(dict))) videos_.push_back(std::move(stream));
     }
     for (const Any& element : streams_.getVector("auds")) {
         if (!element.isDict()) continue;
         auto stream = std::make_unique<AudioGenerator>();
-        if (stream->init(element.asDict()) == QvStatus::ok) audios_.push_back(std::move(stream));
+        if (isUsable(stream->init(element.asDict()))) audios_.push_back(std::move(stream));
     }
 }
 

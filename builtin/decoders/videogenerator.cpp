@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cstring>
 #include <limits>
+#include <new>
 
 #include "builtin/decoders/testtext.h"
 #include "core/engine/status.h"
@@ -28,7 +29,7 @@ void copyPixels(const QvFrame& from, QvFrame& to) {
 int VideoGenerator::init(const AnyDict& dict) {
     takeFramerate(dict["framerate"]);
     if (!dict["picture"].isValid()) {
-        if (!addPlain(dict)) return QvStatus::invalidStructure;
+        if (const int result = addPlain(dict); result != QvStatus::ok) return result;
     } else {
         addPictures(dict);
     }
@@ -67,16 +68,17 @@ void VideoGenerator::takeFramerate(const Any& value) {
     framerate_.setDf(false);
 }
 
-bool VideoGenerator::addPlain(const AnyDict& dict) {
+int VideoGenerator::addPlain(const AnyDict& dict) {
     const int width = dict.getInt32("width", 0);
     const int height = dict.getInt32("height", 0);
     QV_ASSERT_MSG(width >= smallest || height >= smallest,
                   "testgen: No picture and invalid dimensions specified");
     auto frame = std::make_unique<QvFrame>();
-    if (width < 1 || height < 1 || frame->init(QvFourcc::BGR4, width, height) != QvStatus::ok) return false;
+    if (width < 1 || height < 1) return QvStatus::invalidStructure;
+    if (const int result = frame->init(QvFourcc::BGR4, width, height); result != QvStatus::ok) return result;
     frame->setRGB(128, 128, 128);
     pictures_.push_back(std::move(frame));
-    return true;
+    return QvStatus::ok;
 }
 
 void VideoGenerator::addPictures(const AnyDict& dict) {
@@ -92,7 +94,8 @@ void VideoGenerator::addPicture(const Any& picture) {
     } else {
         const bool pointer = picture.isGeneric() && picture.size() == 0 && picture.asGeneric();
         QV_ASSERT_MSG(pointer, "testgen: invalid picture data");
-        *frame = *static_cast<const QvFrame*>(picture.asGeneric());
+        const int result = frame->copy(*static_cast<const QvFrame*>(picture.asGeneric()));
+        if (result == QvStatus::outOfMemory) throw std::bad_alloc();
     }
     if (frame->inited()) pictures_.push_back(std::move(frame));
 }
@@ -131,6 +134,7 @@ void VideoGenerator::makeViews(int count) {
     TPtrList<QvFrame> chain;
     for (int i = 0; i < count; ++i) {
         views_.push_back(std::make_unique<QvFrame>(*pictures_.front()));
+        if (!views_.back()->inited()) throw std::bad_alloc();
         views_.back()->frameNr = -1;
         views_.back()->framerate = framerate_;
         chain.append(views_.back().get());

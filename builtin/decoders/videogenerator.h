@@ -42,7 +42,7 @@ class VideoGenerator : public GeneratorStream {
     bool isGrayBar() const { return mode_ == "graybar"; }
     void takeFramerate(const Any& value);
     void addPicture(const Any& picture);
-    bool addPlain(const AnyDict& dict);
+    int addPlain(const AnyDict& dict);
     void addPictures(const AnyDict& dict);
     void takeAspect(double aspect);
     void countFrames();

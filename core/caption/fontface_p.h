@@ -7,6 +7,7 @@
 
 #include <ft2build.h>
 #include FT_FREETYPE_H
+#include FT_MODULE_H
 #include <hb.h>
 
 class Any;
@@ -21,15 +22,34 @@ struct FontGlyph {
     std::vector<unsigned char> coverage;  // width * rows, 0 to 255
 };
 
+// FreeType goes on without what it finds no memory for, and would leave letters out; where it makes the
+// interpreter of a face's hints, version 2.12 writes through the null pointer. So it gets memory that keeps
+// in mind whether it ran out, and that has a reserve for the interpreters of three faces.
 class FontLibrary {
   public:
-    FontLibrary();                                     // tells the outcome in the debug log
+    FontLibrary();  // tells the outcome in the debug log
+    FontLibrary(const FontLibrary&) = delete;
+    FontLibrary& operator=(const FontLibrary&) = delete;
     FT_Library get() const { return library_.get(); }  // null if FreeType can't be used
 
+    // To be called after what may have taken memory: throws std::bad_alloc if there was none.
+    void checkMemory();
+
   private:
+    static FontLibrary& of(FT_Memory memory) { return *static_cast<FontLibrary*>(memory->user); }
+    static void* take(FT_Memory memory, long size);
+    static void* resize(FT_Memory memory, long oldSize, long size, void* block);
+    static void release(FT_Memory memory, void* block);
     struct Done {
-        void operator()(FT_Library library) const { FT_Done_FreeType(library); }
+        void operator()(FT_Library library) const { FT_Done_Library(library); }
     };
+    void* fromReserve(std::size_t size);
+    bool isReserve(const void* block) const;
+
+    std::unique_ptr<unsigned char[]> reserve_;
+    std::size_t reserveUsed_ = 0;
+    bool ranOut_ = false;
+    FT_MemoryRec_ memory_{this, take, release, resize};
     std::unique_ptr<FT_LibraryRec_, Done> library_;
 };
 
@@ -37,8 +57,8 @@ class FontFace {
   public:
     static constexpr int largestSize = 4096;  // pixels; a letter of it covers the largest pictures
 
-    // What fails is told in the debug log and leaves the face without glyphs.
-    void load(const FontLibrary& library, const Any& file, int pixels);
+    // What fails is told in the debug log and leaves the face without glyphs. The library has to outlive it.
+    void load(FontLibrary& library, const Any& file, int pixels);
     bool usable() const { return face_ != nullptr; }
 
     unsigned indexOf(char32_t character) const;  // 0 if the font does not have it
@@ -54,6 +74,9 @@ class FontFace {
     struct ShaperDone {
         void operator()(hb_font_t* font) const { hb_font_destroy(font); }
     };
+    void draw(unsigned index, FontGlyph& glyph);
+
+    FontLibrary* library_ = nullptr;
     std::unique_ptr<FT_FaceRec_, FaceDone> face_;
     std::unique_ptr<hb_font_t, ShaperDone> shaper_;
     std::unordered_map<unsigned, FontGlyph> glyphs_;

@@ -1,6 +1,7 @@
 #include "core/caption/qvsubtitlerender.h"
 
 #include <algorithm>
+#include <new>
 #include <string>
 #include <string_view>
 
@@ -61,7 +62,9 @@ bool shape(QvFrame& frame, unsigned fourcc, const QvRect& area) {
     if (frame.inited() && frame.four_cc() == fourcc && frame.width() == area.width() &&
         frame.height() == area.height())
         return true;
-    return frame.init(fourcc, area.width(), area.height()) == QvStatus::ok;
+    const int result = frame.init(fourcc, area.width(), area.height());
+    if (result == QvStatus::outOfMemory) throw std::bad_alloc();
+    return result == QvStatus::ok;
 }
 
 void fill(QvFrame& frame, unsigned rgb) {
@@ -134,9 +137,14 @@ struct QvSubtitleRender::Private {
 
     DrawnText& textOf(const DrawnTextKey& key) {
         if (DrawnText* known = texts.find(key)) return *known;
-        DrawnText& text = texts.renew(key);
-        layOut(text);
-        return text;
+        try {
+            DrawnText& text = texts.renew(key);
+            layOut(text);
+            return text;
+        } catch (...) {
+            texts.clear();  // half a layout must not be found again
+            throw;
+        }
     }
 
     void layOut(DrawnText& text) {

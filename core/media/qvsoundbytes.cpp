@@ -3,6 +3,7 @@
 #include <array>
 #include <cstddef>
 #include <memory>
+#include <new>
 #include <span>
 
 #include <zlib.h>
@@ -36,6 +37,7 @@ bool unpack(const Sound& sound, QvPcm& to) {
     auto size = static_cast<uLongf>(to.sizeBytes());
     const int result =
         uncompress(to.ptr(0), &size, sound.packed.data(), static_cast<uLong>(sound.packed.size()));
+    if (result == Z_MEM_ERROR) throw std::bad_alloc();
     return result == Z_OK && size == static_cast<uLongf>(to.sizeBytes());
 }
 
@@ -53,7 +55,8 @@ QvPcm* QvSoundBytes::create(int index) {
     const Sound& sound = soundAt(index);
     auto pcm = std::make_unique<QvPcm>();
     const int bytesPerSample = (format.bitsPerSample + 7) / 8;
-    if (pcm->init(sound.samples, format.channels, bytesPerSample, format.samplerate) != 0) return nullptr;
+    if (pcm->init(sound.samples, format.channels, bytesPerSample, format.samplerate) != 0)
+        throw std::bad_alloc();
     QV_ASSERT(pcm->sizeBytes() == sound.bytes);
     if (!unpack(sound, *pcm)) return nullptr;
     pcm->setSamples(pcm->size());
