@@ -2,6 +2,8 @@
 
 #include <cstdarg>
 #include <cstdio>
+#include <list>
+#include <new>
 #include <string_view>
 #include <utility>
 
@@ -100,7 +102,7 @@ void QvTranscoder::Private::waitForEnd() {
 
 // Joined outside the lock, which the worker needs for its end.
 void QvTranscoder::Private::joinWorkers() {
-    std::vector<std::unique_ptr<QVThreads::QvThread>> ended;
+    std::list<std::unique_ptr<QVThreads::QvThread>> ended;
     std::lock_guard guard(lock);
     ended.swap(workers);
 }
@@ -374,37 +376,46 @@ int QvTranscoder::transcode(bool synchronous) {
     p_->beginRun();
     const QvRunScope scope(p_.get());
     QvTranscodeRun run(*this, *p_);
-    int opened = QvStatus::failed;
     try {
-        opened = run.open();
+        const int opened = run.open();
+        if (opened != QvStatus::ok && opened != QvStatus::warning) {
+            p_->endRun(connected);
+            return opened;
+        }
+        p_->synchronous = synchronous;
+        if (!synchronous) return startWorker(run) ? opened : QvStatus::failed;
     } catch (...) {
-        qv_log()->setLogFile(Any());
         p_->endRun(connected);
+        qv_log()->setLogFile(Any());
         throw;
     }
-    if (opened != QvStatus::ok && opened != QvStatus::warning) {
-        p_->endRun(connected);
-        return opened;
+    return run.start();
+}
+
+// The worker takes the run with it: it outlives this call.
+bool QvTranscoder::startWorker(QvTranscodeRun& run) {
+    std::list<std::unique_ptr<QVThreads::QvThread>> worker;
+    bool started = false;
+    try {
+        worker.push_back(std::make_unique<QVThreads::QvThread>());
+        started = worker.back()->start([this, run]() mutable {
+            const QvRunScope onWorker(p_.get());
+            qv_dbg()->debug("Transcoder thread started");
+            run.start();
+            qv_dbg()->debug("Transcoder thread exiting");
+        }) == QvStatus::ok;
+    } catch (const std::bad_alloc&) {
+        // No memory for a thread is no thread.
     }
-    p_->synchronous = synchronous;
-    if (synchronous) return run.start();
-    // The worker takes the run with it: it outlives this call.
-    auto worker = std::make_unique<QVThreads::QvThread>();
-    const int started = worker->start([this, run]() mutable {
-        const QvRunScope onWorker(p_.get());
-        qv_dbg()->debug("Transcoder thread started");
-        run.start();
-        qv_dbg()->debug("Transcoder thread exiting");
-    });
-    if (started != QvStatus::ok) {
-        run.giveUp();
-        setError(QvStatus::failed, "Failed to spawn processing thread");
-        p_->endRun(transcoding);
-        return QvStatus::failed;
+    if (started) {
+        std::lock_guard guard(p_->lock);
+        p_->workers.splice(p_->workers.end(), worker);
+        return true;
     }
-    std::lock_guard guard(p_->lock);
-    p_->workers.push_back(std::move(worker));
-    return opened;
+    run.giveUp();
+    setError(QvStatus::failed, "Failed to spawn processing thread");
+    p_->endRun(transcoding);
+    return false;
 }
 
 int QvTranscoder::stop() {

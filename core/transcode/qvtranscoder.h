@@ -30,6 +30,7 @@ class QvDPipeList;
 class QvEncodePipe;
 class QvMuxer;
 class QvTask;
+class QvTranscodeRun;
 class TransLink;
 
 class QV_API QvTranscoder {
@@ -126,5 +127,6 @@ class QV_API QvTranscoder {
   private:
     friend class QvTranscodeRun;
     struct Private;
+    bool startWorker(QvTranscodeRun& run);
     std::unique_ptr<Private> p_;
 };

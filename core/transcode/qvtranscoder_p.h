@@ -3,6 +3,7 @@
 
 #include <atomic>
 #include <condition_variable>
+#include <list>
 #include <memory>
 #include <mutex>
 #include <string>
@@ -57,7 +58,7 @@ struct QvTranscoder::Private {
     std::condition_variable changed;
     bool paused = false;
     // Not joined yet; several when a callback of one run started the next.
-    std::vector<std::unique_ptr<QVThreads::QvThread>> workers;
+    std::list<std::unique_ptr<QVThreads::QvThread>> workers;
 
     int errorCode = 0;
     std::string errorText;

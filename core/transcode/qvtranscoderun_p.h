@@ -54,6 +54,7 @@ class QvTranscodeRun {
     static void closeLinks(const QvTask& task);
 
   private:
+    int breakOff();
     // open
     void collectParams();
     int checkTask(int& warning);

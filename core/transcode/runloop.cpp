@@ -47,7 +47,6 @@ int QvTranscodeRun::guarded(Work work) {
 }
 
 int QvTranscodeRun::start() {
-    p_.logProgress = qv_registry()->getDbgOption("log_progress").isTrue();
     int result = QvStatus::ok;
     {
         QVThreads::QvLowPriority lowered;
@@ -57,12 +56,31 @@ int QvTranscodeRun::start() {
             p_.changed.wait_for(guard, std::chrono::milliseconds(p_.startDelay),
                                 [this] { return stopping(); });
         }
-        const QvMuxer* muxer = p_.task->encoder()->getMuxer();
-        p_.checkDiscSpace = muxer && std::string_view(muxer->name()) == "asfmux";
-        result = guarded([this] { return runPasses(); });
+        result = guarded([this] {
+            p_.logProgress = qv_registry()->getDbgOption("log_progress").isTrue();
+            const QvMuxer* muxer = p_.task->encoder()->getMuxer();
+            p_.checkDiscSpace = muxer && std::string_view(muxer->name()) == "asfmux";
+            return runPasses();
+        });
         if (p_.twoPass) forgetStatistics();
     }
-    return finish(result);
+    try {
+        return finish(result);
+    } catch (const std::exception&) {
+        return breakOff();
+    }
+}
+
+// The last resort where not even the end of a run has the memory that it needs: whoever waits is told.
+int QvTranscodeRun::breakOff() {
+    if (number_ == p_.runNumber && p_.running) p_.endRun(QvTranscoder::connected);
+    try {
+        t_.cbDone(QvStatus::outOfMemory);
+    } catch (...) {
+        // There is nobody left to tell.
+    }
+    if (number_ == p_.runNumber) p_.returnTask();
+    return QvStatus::outOfMemory;
 }
 
 int QvTranscodeRun::runPasses() {

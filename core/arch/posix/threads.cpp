@@ -9,7 +9,7 @@
 std::thread QvPlatform::startThread(std::function<void()> body) {
     try {
         return std::thread(std::move(body));
-    } catch (const std::system_error&) {
+    } catch (const std::exception&) {  // no thread, or no memory for one
         return {};
     }
 }
