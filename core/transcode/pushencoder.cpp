@@ -2,7 +2,9 @@
 
 #include <algorithm>
 #include <condition_variable>
+#include <cstdint>
 #include <mutex>
+#include <new>
 #include <string>
 
 #include "core/encode/qvencodepipe.h"
@@ -171,8 +173,12 @@ int PushEncoder::PushEncoder_p::readSamples(unsigned char* to, int count, int nu
 
 void PushEncoder::PushEncoder_p::keep(int status, const char* why) {
     if (status == QvStatus::ok || status == QvStatus::endOfStream || lastStatus != QvStatus::ok) return;
-    qv_dbg()->error("[PushEncoder] the output failed: %s", why);
-    workerError = why;  // before the status, which is what others look at
+    try {
+        workerError = why;  // before the status, which is what others look at
+        qv_dbg()->error("[PushEncoder] the output failed: %s", why);
+    } catch (const std::bad_alloc&) {
+        // The status alone has to do.
+    }
     lastStatus = status;
 }
 
@@ -215,12 +221,14 @@ void PushEncoder::PushEncoder_p::loop() {
 void PushEncoder::PushEncoder_p::work() {
     try {
         loop();
+        qv_dbg()->debug("[PuhEncoder::loop] thread exiting");
+    } catch (const std::bad_alloc&) {
+        keep(QvStatus::outOfMemory, "Out of memory");
     } catch (const QvException& failure) {
         keep(QvStatus::failed, failure.what());
     } catch (const std::exception& failure) {
         keep(QvStatus::failed, failure.what());
     }
-    qv_dbg()->debug("[PuhEncoder::loop] thread exiting");
     running = false;
     tellChange();
 }
@@ -315,7 +323,7 @@ int QvPushEncoder::addAudioStream(AnyDict& params, ProcessParams* process) {
     const int channels = params.getInt32("channels", 0);
     int bytes = params.getInt32("bytesPerSample", 0);
     int bits = params.getInt32("bitsPerSample", 0);
-    if (bits == 0 && bytes > 0 && bytes <= 4) bits = 8 * bytes;
+    if (bits == 0 && bytes > 0) bits = 8 * std::min(bytes, INT32_MAX / 8);
     if (bytes == 0 && bits != 0) bytes = bytesOfBits(bits);
     bool legal = true;
     const auto refuse = [&](const char* problem, int value) {

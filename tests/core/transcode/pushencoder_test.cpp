@@ -167,6 +167,7 @@ TEST_F(Pushing, FormatsAreChecked) {
         if (row.bits) format.set("bitsPerSample", row.bits);
         EXPECT_EQ(push.addAudioStream(format, nullptr), row.logged ? -1 : 0);
         EXPECT_EQ(log.count("[PushEncoder] addAudioStream - invalid", QvLogMask::error), row.logged);
+        EXPECT_EQ(log.contains("invalid bitsPerSample (40)"), row.bytes == 5);
     }
     AnyDict odd("samplerate", 48000, "channels", 1, "bitsPerSample", 17);
     EXPECT_THROW(push.addAudioStream(odd, nullptr), QvAssertFailure);
@@ -229,27 +230,37 @@ TEST_F(Pushing, CloseAtEveryMoment) {
 }
 
 TEST_F(Pushing, AFailingOutputIsTold) {
-    for (const auto how : {FailingOutputs::status, FailingOutputs::assertion}) {
+    struct Row {
+        const char* at;
+        FailingOutputs::How how;
+    };
+    for (const auto& [at, how] :
+         {Row{"rawvenc.write", FailingOutputs::status}, Row{"rawvenc.write", FailingOutputs::assertion},
+          Row{"rawaenc.write", FailingOutputs::status}, Row{"rawaenc.write", FailingOutputs::assertion}}) {
+        SCOPED_TRACE(at);
+        const bool video = at[3] == 'v';
         cleanup_wrapper();
         init_wrapper(nullptr);
         FailingOutputs outputs;
         outputs.how = how;
-        outputs.failAt = "rawvenc.write";
+        outputs.failAt = at;
         pipe_.reset(QvEncodePipe::create());
         pipe_->clearStreams();
         pipe_->setFilename(Any(folder_.file("out.x").c_str()));
         QvPushEncoder push;
-        add(push, true, false);
+        add(push, video, !video);
         ASSERT_EQ(push.open(), 0);
         ASSERT_EQ(push.start(), 0);
         QvFrame frame = picture(1);
+        QvPcm sound;
+        fillSound(sound, 2000, 2, 2, samplerate);
         int result = 0;
         for (int i = 0; i < 1000 && result == 0; ++i) {
-            result = push.writeFrame(&frame, 0);
+            result = video ? push.writeFrame(&frame, 0) : push.writeSamples(&sound, 0);
             if (result == 0) push.process();
         }
         EXPECT_LT(result, 0);
-        EXPECT_NE(std::string(push.errorDesc()).find("rawvenc.write"), std::string::npos);
+        EXPECT_NE(std::string(push.errorDesc()).find(at), std::string::npos) << push.errorDesc();
         EXPECT_EQ(push.close(false), result);
         pipe_->abort();
         pipe_.reset();
