@@ -4,6 +4,7 @@
 #include <charconv>
 #include <cstdio>
 #include <filesystem>
+#include <new>
 
 #include "keyvalues.h"
 #include "timespec.h"
@@ -64,7 +65,7 @@ int filterType(const std::string& name) {
 long long JobStream::bytes(long long units) const {
     if (type == kAudio) return units * channels * ((bits + 7) / 8);
     QvFrame frame;
-    if (frame.init(fourcc, width, height) != QvStatus::ok) return 0;
+    if (frame.init(fourcc, width, height) != QvStatus::ok) throw std::bad_alloc();
     return units * frame.total_bytes();
 }
 

@@ -25,6 +25,8 @@ long long samplesOf(const fs::path& file) {
 }
 
 [[noreturn]] void differs(const std::string& name, long long found, long long wanted, const char* unit) {
+    if (found < 0)
+        throw Failure(Exit::check, inQuotes(name) + " can't be read back; nothing was left behind");
     throw Failure(Exit::check, inQuotes(name) + " is not what was asked for: " + std::to_string(found) +
                                    " instead of " + std::to_string(wanted) + " " + unit +
                                    "; nothing was left behind");

@@ -65,7 +65,7 @@ class Job::Runner : public QvTranscoder {
             if (const TransLink* link = getLinkForOutput(stream.type, stream.encStream);
                 link && link->errorCode() != 0)
                 return link->errorDesc();
-        return errorDesc();
+        return *errorDesc() ? errorDesc() : "the job failed; --log FILE tells more";
     }
 
     void togglePause() { isPaused() ? unpause() : pause(); }
@@ -155,7 +155,7 @@ void Job::run() {
             });
         const int result = runLinked(runner, progress);
         if (const Exit signalled = signals_.received(); signalled != Exit::done) stopped(signalled);
-        if (result != 0) fail(runner);
+        if (result != 0 && result != QvStatus::endOfStream) fail(runner);
         checkResult();
         if (outputs_) names = outputs_->commit("raw");
     }

@@ -3,6 +3,8 @@
 #include <clocale>
 #include <cstdio>
 #include <cstdlib>
+#include <cstring>
+#include <exception>
 #include <memory>
 #include <new>
 #include <sstream>
@@ -16,6 +18,7 @@
 #include "commands.h"
 #include "console.h"
 #include "failure.h"
+#include "outputs.h"
 #include "signals.h"
 
 namespace {
@@ -155,11 +158,28 @@ int run(int argc, char** argv) {
     return status(Exit::done);
 }
 
+bool tell(const char* text) { return write(STDERR_FILENO, text, std::strlen(text)) >= 0; }
+
+// Where memory is so short that not even the way out has enough, nothing half-done may stay behind.
+[[noreturn]] void breakOff() {
+    const bool abandoned = Outputs::abandonAll();
+    const char* reason = "tarsel: an internal error";
+    try {
+        if (std::current_exception()) throw;
+    } catch (const std::bad_alloc&) {
+        reason = "tarsel: out of memory";
+    } catch (...) {
+    }
+    const bool told = tell(reason) && tell(abandoned ? "; nothing was left behind\n" : "\n");
+    _exit(status(told ? Exit::failed : Exit::output));
+}
+
 }  // namespace
 
 int main(int argc, char** argv) {
     std::setlocale(LC_ALL, "C");
     claimStreams();
+    std::set_terminate(breakOff);
     try {
         return run(argc, argv);
     } catch (const Failure& failure) {

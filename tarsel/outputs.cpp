@@ -1,10 +1,12 @@
 #include "outputs.h"
 
 #include <algorithm>
+#include <atomic>
 #include <cerrno>
 #include <cstdio>
 #include <cstring>
 
+#include <dirent.h>
 #include <fcntl.h>
 #include <stdlib.h>
 #include <unistd.h>
@@ -81,6 +83,28 @@ bool place(const fs::path& file, const fs::path& name, bool overwrite) {
     refuse(name, inLine(std::strerror(errno)));
 }
 
+// What the folder holds, which are plain files and links.
+void removeAll(int folder) {
+    alignas(dirent64) char entries[4096];
+    lseek(folder, 0, SEEK_SET);
+    for (ssize_t size; (size = getdents64(folder, entries, sizeof entries)) > 0;)
+        for (ssize_t at = 0; at < size;) {
+            const auto* entry = reinterpret_cast<const dirent64*>(entries + at);
+            unlinkat(folder, entry->d_name, 0);  // fails for "." and ".."
+            at += entry->d_reclen;
+        }
+}
+
+// Those with a hidden folder; a job and its task file.
+std::atomic<Outputs*> g_live[4];
+
+void replaceLive(Outputs* former, Outputs* now) {
+    for (auto& live : g_live) {
+        Outputs* expected = former;
+        if (live.compare_exchange_strong(expected, now)) return;
+    }
+}
+
 void takeBack(const Placed& placed) {
     renameat2(AT_FDCWD, placed.final.c_str(), AT_FDCWD, placed.hidden.c_str(),
               placed.exchanged ? RENAME_EXCHANGE : 0);
@@ -115,8 +139,7 @@ void Outputs::checkFinal(const fs::path& name) const {
 
 void Outputs::checkNumbered(const std::string& extension) const {
     const std::string stem = output_.stem().string() + "#";
-    std::error_code error;
-    for (const auto& entry : fs::directory_iterator(folderOf(output_), error)) {
+    for (const auto& entry : fs::directory_iterator(folderOf(output_))) {
         const std::string name = entry.path().filename().string();
         if (name.rfind(stem, 0) != 0 || entry.path().extension() != "." + extension) continue;
         const std::string number = entry.path().stem().string().substr(stem.size());
@@ -126,7 +149,7 @@ void Outputs::checkNumbered(const std::string& extension) const {
 }
 
 std::string Outputs::withFinalNames(std::string text) const {
-    const std::string hidden = (folder_ / kBase).string();
+    const std::string hidden = (fs::path(folder_) / kBase).string();
     const std::string shown = (output_.parent_path() / output_.stem()).string();
     for (size_t at = 0; !folder_.empty() && (at = text.find(hidden, at)) != std::string::npos;
          at += shown.size())
@@ -142,9 +165,19 @@ std::string Outputs::begin(const std::string& extension) {
     // What is written to a device or a pipe goes straight there, by a link in a folder elsewhere.
     const fs::path where = device_ ? fs::temp_directory_path() : folderOf(output_);
     std::string pattern = (where / ".tarsel-XXXXXX").string();
-    if (!mkdtemp(pattern.data())) refuse(output_, inLine(std::strerror(errno)));
-    folder_ = pattern;
-    fs::path name = folder_ / kBase;
+    folder_ = std::move(pattern);
+    {
+        std::lock_guard guard(lock_);
+        if (!mkdtemp(folder_.data())) refuse(output_, inLine(std::strerror(errno)));
+        folderHandle_ = open(folder_.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
+        if (folderHandle_ >= 0) replaceLive(nullptr, this);
+    }
+    if (folderHandle_ < 0) {
+        const int error = errno;
+        rmdir(folder_.c_str());
+        refuse(output_, inLine(std::strerror(error)));
+    }
+    fs::path name = fs::path(folder_) / kBase;
     name += "." + extension;
     if (device_) {
         std::error_code error;
@@ -163,10 +196,13 @@ std::string Outputs::finalName(const fs::path& written, const std::string& from)
 
 std::vector<fs::path> Outputs::written() const {
     std::vector<fs::path> files;
-    std::error_code error;
     if (device_ || folder_.empty()) return files;
-    for (const auto& entry : fs::directory_iterator(folder_, error)) files.push_back(entry.path());
-    if (error) refuse(output_, inLine(error.message()));
+    // The forms that report by a code end the program when memory is short.
+    try {
+        for (const auto& entry : fs::directory_iterator(folder_)) files.push_back(entry.path());
+    } catch (const fs::filesystem_error& failure) {
+        refuse(output_, inLine(failure.code().message()));
+    }
     std::sort(files.begin(), files.end());
     return files;
 }
@@ -201,7 +237,25 @@ std::vector<std::string> Outputs::commit(const std::string& from) {
 
 void Outputs::discard() {
     std::lock_guard guard(lock_);
-    if (folder_.empty()) return;
-    std::error_code ignored;
-    fs::remove_all(folder_, ignored);
+    if (folderHandle_ < 0) return;
+    replaceLive(this, nullptr);
+    remove();
+}
+
+void Outputs::remove() {
+    removeAll(folderHandle_);
+    close(folderHandle_);
+    folderHandle_ = -1;
+    rmdir(folder_.c_str());
+}
+
+bool Outputs::abandonAll() {
+    bool any = false;
+    for (auto& live : g_live) {
+        Outputs* outputs = live.exchange(nullptr);
+        if (!outputs) continue;
+        outputs->remove();
+        any = true;
+    }
+    return any;
 }

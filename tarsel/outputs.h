@@ -37,6 +37,10 @@ class Outputs {
     // waits for its end.
     void discard();
 
+    // Removes what all objects have written, for a program that can't go on: takes no lock and no memory. False
+    // when there was nothing.
+    static bool abandonAll();
+
     // True when `output` is a device or a pipe, which takes exactly one stream.
     bool isDevice() const { return device_; }
     // A message of the engine with the final names in it in place of those in the hidden folder.
@@ -46,8 +50,12 @@ class Outputs {
     std::string finalName(const std::filesystem::path& written, const std::string& from) const;
 
   private:
-    std::filesystem::path output_, folder_;
+    void remove();
+
+    std::filesystem::path output_;
+    std::string folder_;
     std::vector<std::string> inputs_;
+    int folderHandle_ = -1;  // for discarding, which must not need a further one, nor memory
     bool overwrite_, device_;
     std::mutex lock_;
 };
