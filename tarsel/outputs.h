@@ -37,8 +37,8 @@ class Outputs {
     // waits for its end.
     void discard();
 
-    // Removes what all objects have written, for a program that can't go on: takes no lock and no memory. False
-    // when there was nothing.
+    // Removes what all objects have written, for a program that can't go on: takes no lock and no memory.
+    // False when there was nothing.
     static bool abandonAll();
 
     // True when `output` is a device or a pipe, which takes exactly one stream.

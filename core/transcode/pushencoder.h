@@ -50,8 +50,8 @@ class QV_API QvPushEncoder {
     // may be left out. Rates up to 96000, 8, 16, 20, 24 or 32 bits. Of `process` the filters and the channel
     // map are used. QvStatus::failed for a format that is none; nothing is added then.
     int addAudioStream(AnyDict& params, ProcessParams* process);
-    // Readies the links and then opens the pipe, so that links that can't work leave no empty file behind. The
-    // statuses of the links are ORed. On failure the state stays closed.
+    // Readies the links and then opens the pipe, so that links that can't work leave no empty file behind.
+    // The statuses of the links are ORed. On failure the state stays closed.
     int open();
     int start();  // the worker; asserts "Invalid state" unless open
 
