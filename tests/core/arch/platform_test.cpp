@@ -3,7 +3,6 @@
 #include <gtest/gtest.h>
 #include <sched.h>
 
-#include <atomic>
 #include <cstdint>
 #include <cstdlib>
 #include <filesystem>
@@ -30,6 +29,7 @@ class Variable {
 };
 
 TEST(Platform, PlacesFallBackWhereVariablesAreUnsetOrEmpty) {
+    EXPECT_TRUE(qv_platform().processors() > 0 && !qv_platform().platformName().starts_with("unknown"));
     {
         const Variable home("HOME", "/some/home/"), temp("TMPDIR", "/some/temp//");
         EXPECT_EQ(qv_platform().homeFolder(), "/some/home");
@@ -42,40 +42,24 @@ TEST(Platform, PlacesFallBackWhereVariablesAreUnsetOrEmpty) {
     }
 }
 
-TEST(Platform, ASubstituteIsInForceUntilItsScopeEnds) {
-    struct Named : QvPlatform {
-        std::string platformName() override { return "substitute"; }
-    } named;
-    {
-        const PlatformScope scope(named);
-        EXPECT_EQ(qv_platform().platformName(), "substitute");
-        EXPECT_GT(qv_platform().processors(), 0);
-    }
-    EXPECT_NE(qv_platform().platformName(), "substitute");
-}
-
 TEST(Platform, PriorityComesBackWithoutPrivilege) {
     std::thread([] {
-        const int before = sched_getscheduler(0);
+        const int before = sched_getscheduler(0), lowered = before == SCHED_OTHER ? SCHED_BATCH : before;
         const int former = qv_platform().lowerThreadPriority();
-        EXPECT_TRUE(before != SCHED_OTHER || sched_getscheduler(0) == SCHED_BATCH);
-        const int inner = qv_platform().lowerThreadPriority();
-        qv_platform().restoreThreadPriority(inner);
-        EXPECT_TRUE(before != SCHED_OTHER || sched_getscheduler(0) == SCHED_BATCH);
+        qv_platform().restoreThreadPriority(qv_platform().lowerThreadPriority());
+        EXPECT_EQ(sched_getscheduler(0), lowered);
         qv_platform().restoreThreadPriority(former);
         EXPECT_EQ(sched_getscheduler(0), before);
     }).join();
 }
 
 TEST(Platform, BlocksAreAlignedAndTooMuchIsNull) {
-    for (const std::size_t alignment : {1u, 8u, 64u, 4096u}) {
+    for (const std::size_t alignment : {1u, 8u, 64u, 4096u})
         for (const std::size_t bytes : {0u, 1u, 63u, 100'001u}) {
             void* const block = qv_platform().allocate(bytes, alignment);
-            ASSERT_NE(block, nullptr);
-            EXPECT_EQ(reinterpret_cast<std::uintptr_t>(block) % alignment, 0u);
+            EXPECT_TRUE(block && reinterpret_cast<std::uintptr_t>(block) % alignment == 0) << bytes;
             qv_platform().release(block);
         }
-    }
     EXPECT_EQ(qv_platform().allocate(std::numeric_limits<std::size_t>::max() - 5, 64), nullptr);
     qv_platform().release(nullptr);
 }
@@ -88,15 +72,10 @@ TEST(Platform, CodepagesDecodeAndMarkWhatIsNotValid) {
     } cases[] = {
         {1252, "\x80\xE9", U"\u20AC\u00E9"},
         {1251, "\xCF\xF0", U"\u041F\u0440"},
-        {28605, "\xA4", U"\u20AC"},
         {932, "\x83\x65\x41", U"\u30C6A"},
         {950, "\xA4\xA4", U"\u4E2D"},
-        {949, "\xB0\xA1", U"\uAC00"},
         {50220, "\x1B$B$\"\x1B(B.", U"\u3042."},
-        {65001,
-         "a\xFF"
-         "b",
-         U"a\uFFFDb"},
+        {65001, "a\xFF!", U"a\uFFFD!"},
         {932, "A\x83", U"A\uFFFD"},  // cut off within a character
         {1252, "", U""},
     };
@@ -137,16 +116,17 @@ TEST(Platform, LibrariesFindDependenciesInTheirOwnFolder) {
     void* const library = qv_platform().loadLibrary(temp.file("top_plugin.so").c_str(), error);
     ASSERT_NE(library, nullptr) << error;
     const auto top = reinterpret_cast<int (*)()>(qv_platform().findSymbol(library, "top"));
-    ASSERT_NE(top, nullptr);
-    EXPECT_EQ(top(), 42);
+    ASSERT_TRUE(top && top() == 42);
     EXPECT_EQ(qv_platform().findSymbol(library, "no_such_symbol"), nullptr);
     qv_platform().unloadLibrary(library);
 
     std::filesystem::remove(temp.file("liblow-qv.so"));
-    EXPECT_EQ(qv_platform().loadLibrary(temp.file("top_plugin.so").c_str(), error), nullptr);
-    EXPECT_NE(error, "");
-    EXPECT_EQ(qv_platform().loadLibrary(temp.write("text_plugin.so", "no library").c_str(), error), nullptr);
-    EXPECT_EQ(qv_platform().loadLibrary(temp.file("absent_plugin.so").c_str(), error), nullptr);
+    temp.write("text_plugin.so", "no library");
+    for (const char* name : {"top_plugin.so", "text_plugin.so", "absent_plugin.so"}) {
+        error.clear();
+        EXPECT_EQ(qv_platform().loadLibrary(temp.file(name).c_str(), error), nullptr);
+        EXPECT_NE(error, "") << name;
+    }
 }
 
 }  // namespace

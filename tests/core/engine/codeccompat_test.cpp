@@ -16,13 +16,9 @@ TEST(CodecCompatList, NamesAreAddedOnceAndOnlyToKnownCodecs) {
     list.add("rawvenc", "rawavimux");
     list.addCodec("rawvenc");
     EXPECT_EQ(list.names("rawvenc").size(), 2);
-    EXPECT_TRUE(list.isCompatible("rawvenc", "rawavimux"));
-    list.removeName("rawvenc", "absent");
-    list.removeName("rawvenc", "rawmux");
-    EXPECT_FALSE(list.isCompatible("rawvenc", "rawmux"));
-    EXPECT_TRUE(list.isCompatible("rawvenc", "rawavimux"));
-    EXPECT_FALSE(list.isCompatible("other", "rawmux"));
-    EXPECT_FALSE(list.isCompatible(nullptr, "rawmux"));
+    for (const char* name : {"absent", "rawmux"}) list.removeName("rawvenc", name);
+    EXPECT_TRUE(list.isCompatible("rawvenc", "rawavimux") && !list.isCompatible("rawvenc", "rawmux"));
+    EXPECT_FALSE(list.isCompatible("other", "rawmux") || list.isCompatible(nullptr, "rawmux"));
 }
 
 }  // namespace

@@ -45,7 +45,7 @@ class Listing : public testing::Test {
     }
 };
 
-TEST_F(Listing, ExtensionsAreTheEndsOfTexts) {
+TEST_F(Listing, ExtensionsAreTheEndsOfNames) {
     files({"a.png", "b.PNG", "c.png", "png", "x.jpg", "aa.png.bak"});
     fs::create_directory(temp.file("dir.png"));
     EXPECT_EQ(matching(".png"), (Texts{"a.png", "c.png", "dir.png"}));

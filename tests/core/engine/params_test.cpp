@@ -20,6 +20,7 @@ struct Settings {
     AnyDict extra;
     int secret = 0;
     int half = 0;
+    double level = 0;
 };
 
 int setHalf(Settings& s, const Any& value) {
@@ -43,6 +44,7 @@ constexpr QvParamRow<Settings> rows[] = {
     {"count", &Settings::half, qvParamReadOnly},
     {"double", QvParamAccess<Settings>{setHalf, getHalf}, qvParamStored},
     {"view", QvParamAccess<Settings>{nullptr, getHalf}},
+    {"level", &Settings::level},
 };
 static_assert(qvParamTableOk<Settings>(rows));
 
@@ -71,6 +73,7 @@ TEST(Params, NumbersAreCheckedAtTheDoor) {
         {"offset", {LLONG_MAX, -2.9}, {9.3e18, -9.3e18}},
         {"mask", {0xFFFFFFFFLL, 0}, {-1, 4294967296.0}},
         {"gain", {8, 0}, {8.0001, infinity, nan}},
+        {"level", {1e300, 5}, {nan, "1"}},
         {"invert", {2, 0.5}, {"false", Any()}},
         {"rate", {25, 29.97, QvFramerate(50.0)}, {0, -25.0, nan, infinity, 1e300, 1e-9}},
         {"extra", {AnyDict("a", 1), AnyDict()}, {1, Any()}},
@@ -150,7 +153,7 @@ TEST(Params, RefusalSaysWhatIsTaken) {
 
 TEST(Params, DescriptionTellsTypeRangeDefaultAndUse) {
     const AnyVector all = qvDescribeParamRows<Settings>(rows, Settings());
-    ASSERT_EQ(all.size(), 12);  // the ignored row is nobody's business
+    ASSERT_EQ(all.size(), 13);  // the ignored row is nobody's business
     EXPECT_EQ(all.at(0), Any(AnyDict("name", "frames", "type", "Int32", "min", 1.0, "max", 1000.0, "default",
                                      25, "description", "length of the fade in frames")));
     EXPECT_EQ(all.at(1),

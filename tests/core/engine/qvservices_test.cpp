@@ -40,23 +40,22 @@ TEST(Services, MemoryAndConstants) {
 }
 
 TEST(Services, MessagesReachTheUsersList) {
-    const struct {
-        const char* name;
-        int mask;
-    } cases[] = {{"err_printf", 2}, {"wrn_printf", 4}, {"inf_printf", 8}, {"prg_printf", 0}};
-    for (const auto& c : cases) {
+    using Printer = void(void*, const char*, ...);
+    for (const auto& [name, mask] : {std::pair<std::string, int>{"err_printf", 2},
+                                     {"wrn_printf", 4},
+                                     {"inf_printf", 8},
+                                     {"prg_printf", 0}}) {
         qv_log()->clear();
-        service<void(const char*, ...)>(c.name)("%s %d", "plain", 1);
-        serviceEx<void(void*, const char*, ...)>(c.name)(qv_log(), "%s %d", "context", 2);
-        serviceEx<void(void*, const char*, ...)>((std::string(c.name) + "_ex").c_str())(nullptr, "%s %d",
-                                                                                        "ex", 3);
+        service<void(const char*, ...)>(name.c_str())("%s %d", "plain", 1);
+        serviceEx<Printer>(name.c_str())(qv_log(), "%s %d", "context", 2);
+        serviceEx<Printer>((name + "_ex").c_str())(nullptr, "%s %d", "ex", 3);
         AnyVector all;
         qv_log()->getAll(all);
-        ASSERT_EQ(all.size(), c.mask ? 3 : 0) << c.name;
+        ASSERT_EQ(all.size(), mask ? 3 : 0) << name;
         const char* texts[] = {"plain 1", "context 2", "ex 3"};
         for (int i = 0; i < all.size(); ++i) {
             EXPECT_STREQ(all.at(i).asDict().getString("text"), texts[i]);
-            EXPECT_EQ(all.at(i).asDict().getInt32("type"), c.mask);
+            EXPECT_EQ(all.at(i).asDict().getInt32("type"), mask);
         }
     }
     service<void(const char*, ...)>("inf_printf")("%s", std::string(1500, 'x').c_str());

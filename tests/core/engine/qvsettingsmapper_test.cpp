@@ -117,8 +117,7 @@ TEST_F(Mapper, RecordsGoThroughADictionaryAndBack) {
     Settings other;
     EXPECT_EQ(mapper.dictToStruct(dict, &other), 0);
     EXPECT_EQ(other.matrix[1], 42);
-    dict.set("unknown", 1);
-    dict.set("shift", -9);
+    dict.update(AnyDict("unknown", 1, "shift", -9));
     EXPECT_EQ(mapper.dictToStruct(dict, &other), -1);
     EXPECT_EQ(other.shift, -9);
     AnyVector names;

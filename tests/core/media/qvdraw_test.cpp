@@ -39,12 +39,10 @@ TEST(QvColor, ConvertsBothWays) {
         bool hd;
         unsigned out;
     } toYuv[] = {
-        {QvColor(0x000000), false, 0x008080}, {QvColor(0xffffff), false, 0xff8080},
-        {QvColor(0xffffff), true, 0xff8080},  {QvColor(0xff0000), false, 0x4c56ff},
-        {QvColor(0xff0000), true, 0x3964ff},  {QvColor(0x00ff00), false, 0x962d16},
-        {QvColor(0x00ff00), true, 0xb71f0d},  {QvColor(0x0000ff), false, 0x1dff6c},
-        {QvColor(0x0000ff), true, 0x12ff75},  {QvColor(0xc85a28), false, 0x7555bb},
-        {QvColor(0xc85a28), true, 0x705bba},  {{1, 2, 3, true}, true, 0x010203},
+        {QvColor(0xffffff), true, 0xff8080}, {QvColor(0xff0000), false, 0x4c56ff},
+        {QvColor(0xff0000), true, 0x3964ff}, {QvColor(0x00ff00), false, 0x962d16},
+        {QvColor(0x00ff00), true, 0xb71f0d}, {QvColor(0x0000ff), false, 0x1dff6c},
+        {QvColor(0x0000ff), true, 0x12ff75}, {{1, 2, 3, true}, true, 0x010203},
     };
     for (const auto& c : toYuv) {
         const QvColor got = c.in.yuv(c.hd);

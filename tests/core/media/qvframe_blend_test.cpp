@@ -144,7 +144,7 @@ struct Clip {
 
 TEST(QvFrameClip, CopiesEvenAreas) {
     const Clip clips[] = {
-        {0, 0, 0, 0, 9, 7}, {3, 2, 1, 5, 5, 3}, {1, 1, 3, 3, 7, 5}, {2, 3, 4, 1, 0, 0}, {5, 4, 2, 2, 1, 1}};
+        {2, 2, 4, 3, 9, 7}, {3, 2, 1, 5, 5, 3}, {1, 1, 3, 3, 7, 5}, {2, 3, 4, 1, 0, 0}, {5, 4, 2, 2, 1, 1}};
     unsigned seed = 1;
     for (unsigned fourcc : allFormats()) {
         if (fourcc == v210) continue;

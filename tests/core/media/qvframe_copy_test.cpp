@@ -139,10 +139,8 @@ TEST(QvFrameCopy, TakesForeignPlanes) {
         QvFrame kept, plain;
         kept.copyFramett(*source.getFrame_tt(), true);
         plain.copyFramett(*source.getFrame_tt(), false);
-        for (int p = 0; p < source.planes(); ++p) {
-            EXPECT_EQ(kept.stride(p), source.stride(p));
-            EXPECT_LE(plain.stride(p), source.stride(p));
-        }
+        for (int p = 0; p < source.planes(); ++p)
+            EXPECT_TRUE(kept.stride(p) == source.stride(p) && plain.stride(p) <= source.stride(p)) << p;
         // Bottom-up planes.
         if (source.isPlanar()) return;
         frame_tt upsideDown = *source.getFrame_tt();

@@ -66,17 +66,16 @@ void Image::write(const std::string& name) const {
     if (transparent) png_set_tRNS(png, info, paletteAlpha, 2, &key);
     png_write_info(png, info);
     if (depth < 8) png_set_packing(png);
-    std::vector<std::vector<png_byte>> rows;
-    for (int y = 0; y < static_cast<int>(height); ++y) {
-        rows.emplace_back();
-        for (int x = 0; x < static_cast<int>(width); ++x)
-            for (int c = 0; c < channels(); ++c) {
-                rows.back().push_back(static_cast<png_byte>(sample(x, y, c)));
-                if (depth == 16) rows.back().push_back(static_cast<png_byte>(x * 99));  // stripped
-            }
-    }
+    std::vector<std::vector<png_byte>> rows(height);
     std::vector<png_bytep> pointers;
-    for (auto& row : rows) pointers.push_back(row.data());
+    for (int y = 0; y < static_cast<int>(height); ++y) {
+        auto& row = rows[static_cast<std::size_t>(y)];
+        for (int i = 0; i < static_cast<int>(width) * channels(); ++i) {
+            row.push_back(static_cast<png_byte>(sample(i / channels(), y, i % channels())));
+            if (depth == 16) row.push_back(static_cast<png_byte>(i * 99));  // stripped
+        }
+        pointers.push_back(row.data());
+    }
     png_write_image(png, pointers.data());
     png_write_end(png, info);
     png_destroy_write_struct(&png, &info);

@@ -39,10 +39,15 @@ TEST(QvPcm, GrowsByWhatIsMissing) {
 
 TEST(QvPcm, AppendsFromItself) {
     QvPcm pcm;
+    Bytes wanted = ramp(4);
     pcm.init(4, 1, 1, 8000);
-    pcm.write(4, ramp(4).data());
-    for (int i = 0; i < 10; ++i) ASSERT_EQ(pcm.write(pcm.samples(), pcm.ptr(0)), 0);
-    for (int i = 4; i < pcm.samples(); ++i) ASSERT_EQ(*pcm.ptr(i), *pcm.ptr(i - 4));
+    pcm.write(4, wanted.data());
+    for (int i = 0; i < 10; ++i) {
+        ASSERT_EQ(pcm.write(pcm.samples() - 1, pcm.ptr(1)), 0);
+        const Bytes tail(wanted.begin() + 1, wanted.end());
+        wanted.insert(wanted.end(), tail.begin(), tail.end());
+    }
+    EXPECT_EQ(contents(pcm), wanted);
 }
 
 TEST(QvPcm, SilenceDependsOnTheWidth) {

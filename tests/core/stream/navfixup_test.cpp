@@ -35,50 +35,40 @@ struct Program {
 // (6 bytes of header, substream, 979 bytes of data) and the data search packet (the same, 1,017 bytes).
 constexpr size_t pci = 14 + 24 + 6 + 1;
 constexpr size_t dsi = pci + 979 + 6 + 1;
-constexpr size_t pciHighlight = pci + 0x60;  // general highlight information
-constexpr size_t dsiSeamless = dsi + 0x20;
+constexpr size_t highlightEnd = pci + 0x60 + 6, selectionEnd = highlightEnd + 4;
+constexpr size_t objectEnd = dsi + 0x20 + 0x10;
 constexpr size_t dsiSearch = dsi + 0xEA;
+constexpr size_t nextVideo = dsiSearch, previousVideo = dsiSearch + 0xA4;
+constexpr size_t nextVobu = dsiSearch + 0x50, previousVobu = dsiSearch + 0x54;
 constexpr size_t dsiSynch = dsi + 0x192;
 
 class Pack {
   public:
     Pack(const std::string& file, uint32_t sector) : bytes_(file.substr(sector * sectorBytes, sectorBytes)) {}
 
-    uint32_t highlightEnd() const { return u32(pciHighlight + 6); }
-    uint32_t selectionEnd() const { return u32(pciHighlight + 10); }
-    uint32_t objectEnd() const { return u32(dsiSeamless + 0x10); }
-    uint32_t nextVideo() const { return u32(dsiSearch); }
-    // Entry 0 is the nearest time, half a second.
-    uint32_t forward(size_t entry) const { return u32(dsiSearch + 4 + 4 * (18 - entry)); }
-    uint32_t next() const { return u32(dsiSearch + 0x50); }
-    uint32_t previous() const { return u32(dsiSearch + 0x54); }
-    uint32_t backward(size_t entry) const { return u32(dsiSearch + 0x58 + 4 * entry); }
-    uint32_t previousVideo() const { return u32(dsiSearch + 0xA4); }
-    uint32_t audio(size_t stream) const { return u32(dsiSynch + 2 * stream) >> 16; }
-    uint32_t subpic(size_t stream) const { return u32(dsiSynch + 16 + 4 * stream); }
-
-    // The bytes that no field of the above covers.
-    std::string untouched() const {
-        std::string rest = bytes_;
-        for (const auto& [at, size] : std::map<size_t, size_t>{
-                 {pciHighlight + 6, 8}, {dsiSeamless + 0x10, 4}, {dsiSearch, 0xA8}, {dsiSynch, 144}})
-            rest.replace(at, size, size, '-');
-        return rest;
-    }
-
-  private:
     uint32_t u32(size_t at) const {
         uint32_t value = 0;
         for (size_t i = 0; i < 4; ++i) value = value << 8 | static_cast<unsigned char>(bytes_[at + i]);
         return value;
     }
+    // Entry 0 is the nearest time, half a second.
+    uint32_t forward(size_t entry) const { return u32(dsiSearch + 4 + 4 * (18 - entry)); }
+    uint32_t backward(size_t entry) const { return u32(dsiSearch + 0x58 + 4 * entry); }
+    uint32_t audio(size_t stream) const { return u32(dsiSynch + 2 * stream) >> 16; }
+    uint32_t subpic(size_t stream) const { return u32(dsiSynch + 16 + 4 * stream); }
 
+    // The bytes that no field is in.
+    std::string untouched() const {
+        std::string rest = bytes_;
+        for (const auto& [at, size] :
+             std::map<size_t, size_t>{{highlightEnd, 8}, {objectEnd, 4}, {dsiSearch, 0xA8}, {dsiSynch, 144}})
+            rest.replace(at, size, size, '-');
+        return rest;
+    }
+
+  private:
     std::string bytes_;
 };
-
-std::string sectorsOf(const Vobu& vobu, size_t index) {
-    return pattern(vobu.sectors * sectorBytes, static_cast<unsigned>(index + 1));
-}
 
 // Writes the program and returns the contents of its files.
 Texts multiplex(const Program& program, Texts* before = nullptr) {
@@ -107,17 +97,16 @@ Texts multiplex(const Program& program, Texts* before = nullptr) {
         if (std::count(program.cells.begin(), program.cells.end(), i)) tell(in, NAV_CELL_START);
         const uint32_t info[3] = {sector, vobu.duration, vobu.video ? 1u : 0u};
         tell(in, NAV_VOBU_INFO, info);
-        for (uint32_t a = 0; a < program.audio.size(); ++a)
-            if (i < program.audio[a].size()) {
-                const uint32_t entry[2] = {a, static_cast<uint32_t>(program.audio[a][i])};
-                tell(in, NAV_AUDIO_LIST_APPEND, entry);
+        const auto append = [&](const auto& lists, unsigned id) {
+            for (uint32_t list = 0; list < lists.size(); ++list) {
+                if (i >= lists[list].size()) continue;
+                const uint32_t entry[2] = {list, static_cast<uint32_t>(lists[list][i])};
+                tell(in, id, entry);
             }
-        for (uint32_t p = 0; p < program.subpics.size(); ++p)
-            if (i < program.subpics[p].size()) {
-                const uint32_t entry[2] = {p, program.subpics[p][i]};
-                tell(in, NAV_SUBPIC_LIST_APPEND, entry);
-            }
-        const std::string data = sectorsOf(vobu, i);
+        };
+        append(program.audio, NAV_AUDIO_LIST_APPEND);
+        append(program.subpics, NAV_SUBPIC_LIST_APPEND);
+        const std::string data = pattern(vobu.sectors * sectorBytes, static_cast<unsigned>(i + 1));
         copyIn(in, data);
         plain.back() += data;
         sector += vobu.sectors;
@@ -181,12 +170,12 @@ struct Walk {
 void checkSearch(const Pack& pack, const Walk& w) {
     SCOPED_TRACE("VOBU " + std::to_string(w.here));
     const bool next = w.here + 1 <= w.last, previous = w.here - 1 >= w.first;
-    EXPECT_EQ(pack.next(), next ? w.link(w.here + 1) : 0x3FFFFFFF);
-    EXPECT_EQ(pack.previous(), previous ? w.link(w.here - 1) : 0x3FFFFFFF);
-    EXPECT_EQ(pack.nextVideo(), next && w.video(w.here + 1) ? w.link(w.here + 1) : 0xBFFFFFFF);
+    EXPECT_EQ(pack.u32(nextVobu), next ? w.link(w.here + 1) : 0x3FFFFFFF);
+    EXPECT_EQ(pack.u32(previousVobu), previous ? w.link(w.here - 1) : 0x3FFFFFFF);
+    EXPECT_EQ(pack.u32(nextVideo), next && w.video(w.here + 1) ? w.link(w.here + 1) : 0xBFFFFFFF);
     int back = w.here - 1;
     while (back >= w.first && !w.video(back)) --back;
-    EXPECT_EQ(pack.previousVideo(), back >= w.first ? w.link(back) : 0xBFFFFFFF);
+    EXPECT_EQ(pack.u32(previousVideo), back >= w.first ? w.link(back) : 0xBFFFFFFF);
     for (size_t k = 0; k < 19; ++k) {
         EXPECT_EQ(pack.forward(k), w.entry(k, 1)) << "forward " << k;
         EXPECT_EQ(pack.backward(k), w.entry(k, -1)) << "backward " << k;
@@ -202,51 +191,40 @@ Program longProgram(size_t count) {
     return program;
 }
 
-void checkAll(const Program& program, const std::function<std::pair<int, int>(int)>& cellOf) {
+// `windows`: where search begins anew, and the end.
+void checkAll(const Program& program, const std::vector<int>& windows) {
     Texts before;
     const Texts files = multiplex(program, &before);
     const std::vector<uint32_t> sectors = sectorsIn(program);
     size_t file = 0;
     for (int i = 0; i < static_cast<int>(program.vobus.size()); ++i) {
         if (i && sectors[static_cast<size_t>(i)] == 0) ++file;
-        const auto [first, last] = cellOf(i);
+        const auto end = std::upper_bound(windows.begin(), windows.end(), i);
         const Pack pack(files[file], sectors[static_cast<size_t>(i)]);
         const Pack original(before[file], sectors[static_cast<size_t>(i)]);
-        checkSearch(pack, {.program = program, .first = first, .last = last, .here = i});
-        EXPECT_EQ(pack.objectEnd(), (file + 1) * 0x01020304);
-        EXPECT_EQ(pack.highlightEnd(), program.highlight ? pack.objectEnd() : original.highlightEnd());
-        EXPECT_EQ(pack.selectionEnd(), program.highlight ? pack.objectEnd() : original.selectionEnd());
+        checkSearch(pack, {.program = program, .first = end[-1], .last = *end - 1, .here = i});
+        EXPECT_EQ(pack.u32(objectEnd), (file + 1) * 0x01020304);
+        EXPECT_EQ(pack.u32(highlightEnd),
+                  program.highlight ? pack.u32(objectEnd) : original.u32(highlightEnd));
+        EXPECT_EQ(pack.u32(selectionEnd),
+                  program.highlight ? pack.u32(objectEnd) : original.u32(selectionEnd));
         EXPECT_TRUE(pack.untouched() == original.untouched()) << i;
     }
     for (size_t f = 0; f < files.size(); ++f) ASSERT_EQ(files[f].size(), before[f].size());
 }
 
-TEST(NavigationFixup, SearchTableOfOneFileWithoutCells) {
-    const Program program = longProgram(600);  // more than 240 s: every entry is reached somewhere
-    checkAll(program, [](int) { return std::pair(0, 599); });
+// A first file of more than 240 s, so that every entry is reached somewhere; each file is its own world.
+TEST(NavigationFixup, SearchTableOfFilesWithoutCells) {
+    Program program = longProgram(820);
+    program.segmentStarts = {0, 600, 601, 750};
+    checkAll(program, {0, 600, 601, 750, 820});
 }
 
 TEST(NavigationFixup, SearchStaysWithinItsCell) {
     Program program = longProgram(400);
     program.cells = {0, 50, 51, 320};
     program.highlight = true;
-    checkAll(program, [](int i) {
-        return i < 50    ? std::pair(0, 49)
-               : i < 51  ? std::pair(50, 50)
-               : i < 320 ? std::pair(51, 319)
-                         : std::pair(320, 399);
-    });
-}
-
-TEST(NavigationFixup, EachFileIsItsOwnWorld) {
-    Program program = longProgram(300);
-    program.segmentStarts = {0, 100, 101, 250};
-    checkAll(program, [](int i) {
-        return i < 100   ? std::pair(0, 99)
-               : i < 101 ? std::pair(100, 100)
-               : i < 250 ? std::pair(101, 249)
-                         : std::pair(250, 299);
-    });
+    checkAll(program, {0, 50, 51, 320, 400});
 }
 
 // A cell goes on in the next file, though each file counts its sectors from 0.
@@ -254,9 +232,7 @@ TEST(NavigationFixup, CellsAndFilesTogether) {
     Program program = longProgram(8);
     program.segmentStarts = {0, 4};
     program.cells = {0, 2, 6};
-    checkAll(program, [](int i) {
-        return i < 2 ? std::pair(0, 1) : i < 6 ? std::pair(2, 5) : std::pair(6, 7);
-    });
+    checkAll(program, {0, 2, 6, 8});
 }
 
 TEST(NavigationFixup, GapsWithoutVideoAreSeenAtAFixedPoint) {
@@ -270,10 +246,10 @@ TEST(NavigationFixup, GapsWithoutVideoAreSeenAtAFixedPoint) {
     EXPECT_EQ(first.forward(15), 19u | 0x40000000) << "10 s, with video on the way";
     EXPECT_EQ(first.forward(16), 0x7FFFFFFF) << "no 30 s, but video behind the 10 s";
     EXPECT_EQ(first.forward(17), 0x3FFFFFFF) << "nothing behind an entry that found nothing";
-    EXPECT_EQ(first.nextVideo(), 0x80000001);
+    EXPECT_EQ(first.u32(nextVideo), 0x80000001);
     const Pack gap(files[0], 10);
-    EXPECT_EQ(gap.nextVideo(), 0xBFFFFFFF) << "only the successor is asked";
-    EXPECT_EQ(gap.previousVideo(), 0x80000009) << "the nearest before it is searched";
+    EXPECT_EQ(gap.u32(nextVideo), 0xBFFFFFFF) << "only the successor is asked";
+    EXPECT_EQ(gap.u32(previousVideo), 0x80000009) << "the nearest before it is searched";
     EXPECT_EQ(gap.backward(7), 8u);
     EXPECT_EQ(gap.backward(8), 0x80000009);
     EXPECT_EQ(gap.backward(15), 0x3FFFFFFF);
@@ -285,13 +261,13 @@ TEST(NavigationFixup, GapsWithoutVideoAreSeenAtAFixedPoint) {
 TEST(NavigationFixup, AudioFieldsAreSignAndMagnitude) {
     Program program;
     for (int i = 0; i < 8; ++i) program.vobus.push_back({10, halfSecond, true});
-    program.audio = {{5, -5, 0, 32'767, 32'768, -40'000, 1, INT32_MIN}, {1}};
+    program.audio = {{5, -5, 0, 32'767, 32'768, -32'768, 1, INT32_MIN}, {35}};
     program.limit = 35;
     const Texts files = multiplex(program);
     const auto field = [&](uint32_t vobu, size_t stream) { return Pack(files[0], vobu * 10).audio(stream); };
     const uint32_t expected[] = {5, 0x8005, 0x7FFF, 32'766, 0x7FFF, 0xFFFF, 0x7FFF, 0xFFFF};
     for (uint32_t i = 0; i < 8; ++i) EXPECT_EQ(field(i, 0), expected[i]) << i;
-    EXPECT_EQ(field(0, 1), 1u);
+    EXPECT_EQ(field(0, 1), 35u) << "at the limit";
     EXPECT_EQ(field(1, 1), 0x7FFFu) << "a list that is too short has no entry";
 }
 

@@ -126,13 +126,10 @@ TEST(QvAuxinfoQueue, HandsUnitsFromOneThreadToAnother) {
     });
     QvAuQueuePoll& consumer = out.queue;
     uint32_t received = 0;
-    for (bool ended = false; !ended;) {
-        if (!consumer.hasData()) {
-            std::this_thread::yield();
-            continue;
-        }
+    for (;;) {
+        while (!consumer.hasData()) std::this_thread::yield();
         const QvAuxinfoData item = consumer.popData();
-        if ((ended = item.infoId() == int{STREAM_END_CODE})) break;
+        if (item.infoId() == int{STREAM_END_CODE}) break;
         const auto* info = static_cast<const uint32_t*>(item.info());
         ASSERT_EQ(info[1], received);
         ASSERT_TRUE(payloadOf(item) == pattern(info[0], received)) << "unit " << received;

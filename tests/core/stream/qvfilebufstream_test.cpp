@@ -165,6 +165,7 @@ TEST_F(FileStream, AFullDiscReachesTheWriterAndWhoeverCloses) {
     EXPECT_EQ(stream.ioError(), ENOSPC);
     EXPECT_NE(stream.ioErrorText().find("full.bin"), std::string::npos) << stream.ioErrorText();
     EXPECT_EQ(qv_log()->nrErrors(), 1) << "told once";
+    EXPECT_EQ(in->split(in), BUFSTREAM_FAILED);
     stream.destroy(0);
     EXPECT_EQ(stream.ioError(), ENOSPC);
 

@@ -257,7 +257,6 @@ TEST(RestoreDict, resultsAndSideResults) {
 
     EXPECT_EQ(restored("<Root version='3'><dict><key>a</key><i32>1</i32></dict></Root>").dict,
               AnyDict("__class__", "Root", "a", 1));
-
     r = restored("<Root/>");
     EXPECT_TRUE(r.result == -1 && r.root == "Root" && r.version == Any(-1) && r.dict.empty());
     EXPECT_TRUE(log.contains("holds no entries"));
