@@ -110,6 +110,11 @@ size_t fillVectors(AnyLayout, Byte*, const Triple&, const Triple&, uint32_t, siz
     return 0;
 }
 
+template <class Sample>
+size_t fillWholeVectors(Byte*, const Triple&, const Triple&, bool, size_t) {
+    return 0;
+}
+
 #else
 
 template <class V>
@@ -179,7 +184,50 @@ size_t fillVectors(Layout<Lane, Fields...>, Byte* row, const Triple& now, const 
     return i;
 }
 
+// Samples that fill their lanes, one guess alone: saturating arithmetic needs no room above them.
+template <class V, class D>
+HWY_INLINE V wholeRoom(D d, const VectorTriple<V>& now, const VectorTriple<V>& before) {
+    using T = hn::TFromD<D>;
+    constexpr unsigned levels = 1u << 8 * sizeof(T);
+    const auto change = [](V a, V b) HWY_ATTR { return hn::Sub(hn::Max(a, b), hn::Min(a, b)); };
+    const auto most = hn::Max(hn::Max(change(now.above, before.above), change(now.below, before.below)),
+                              change(now.at, before.at));
+    const auto left = hn::SaturatedSub(hn::Set(d, static_cast<T>(12 * levels / 256)), most);
+    const auto isFull = hn::Eq(hn::Max(left, hn::Set(d, static_cast<T>(levels / roomPerStep))), left);
+    return hn::IfThenElse(isFull, hn::Set(d, static_cast<T>(levels - 1)), hn::ShiftLeft<5>(left));
+}
+static_assert(roomPerStep == 1 << 5);
+
+template <class Sample>
+size_t fillWholeVectors(Byte* row, const Triple& now, const Triple& before, bool isWoven, size_t bytes) {
+    const hn::ScalableTag<uint8_t> d8;
+    const hn::Repartition<Sample, decltype(d8)> d;
+    const size_t step = hn::Lanes(d8);
+    size_t i = 0;
+    for (; i + step <= bytes; i += step) {
+        const auto lanes = loadTriple(d, now, i);
+        auto filled = hn::AverageRound(lanes.above, lanes.below);
+        if (isWoven) {
+            const auto room = before.at ? wholeRoom(d, lanes, loadTriple(d, before, i)) : hn::Zero(d);
+            const auto low = hn::SaturatedSub(hn::Min(lanes.above, lanes.below), room);
+            const auto high = hn::SaturatedAdd(hn::Max(lanes.above, lanes.below), room);
+            filled = hn::Max(low, hn::Min(high, lanes.at));
+        }
+        hn::StoreU(hn::BitCast(d8, filled), d8, row + i);
+    }
+    return i;
+}
+
 #endif
+
+template <class Sample, class AnyLayout>
+void fillWhole(AnyLayout layout, Byte* row, const Triple& now, const Triple& before, uint32_t w,
+               size_t bytes) {
+    const bool isMixed = w != 0 && w != 256;
+    const size_t done = isMixed ? fillVectors(layout, row, now, before, w, bytes)
+                                : fillWholeVectors<Sample>(row, now, before, w != 0, bytes);
+    fillLanes(layout, row, now, before, w, done, bytes);
+}
 
 template <class AnyLayout>
 void fill(AnyLayout layout, Byte* row, const Triple& now, const Triple& before, uint32_t w, size_t bytes) {
@@ -188,11 +236,11 @@ void fill(AnyLayout layout, Byte* row, const Triple& now, const Triple& before, 
 
 void fillRow(Samples samples, Byte* row, const Triple& now, const Triple& before, uint32_t w, size_t bytes) {
     switch (samples) {
-        case Samples::words: return fill(WordLayout(), row, now, before, w, bytes);
+        case Samples::words: return fillWhole<uint16_t>(WordLayout(), row, now, before, w, bytes);
         case Samples::tens: return fill(TenLayout(), row, now, before, w, bytes);
         case Samples::rgb555: return fill(Rgb555Layout(), row, now, before, w, bytes);
         case Samples::rgb565: return fill(Rgb565Layout(), row, now, before, w, bytes);
-        default: return fill(ByteLayout(), row, now, before, w, bytes);
+        default: return fillWhole<uint8_t>(ByteLayout(), row, now, before, w, bytes);
     }
 }
 
