@@ -30,14 +30,18 @@ struct Size {
     int width, height;
 };
 
+struct CloseFile {
+    void operator()(std::FILE* file) const { std::fclose(file); }
+};
+using File = std::unique_ptr<std::FILE, CloseFile>;
+
+File fileOf(const char* name) { return File(qv_platform().openFile(name, "rb")); }
+
 // The size in the head of a PNG: what is read of one is rounded up to even.
 Size sizeInFile(const char* name, const QvFrame& picture) {
-    struct CloseFile {
-        void operator()(std::FILE* file) const { std::fclose(file); }
-    };
     constexpr size_t headBytes = 24, sizesAt = 16;
     unsigned char head[headBytes] = {};
-    const std::unique_ptr<std::FILE, CloseFile> file(qv_platform().openFile(name, "rb"));
+    const File file = fileOf(name);
     if (!file || std::fread(head, 1, headBytes, file.get()) != headBytes)
         return {picture.width(), picture.height()};
     const auto at = [&](size_t i) {
@@ -88,6 +92,7 @@ int QvLogo::open() {
     const char* name = settings_.filename.c_str();
     prepared_ = false;
     if (settings_.filename.empty()) return setError(QvStatus::failed, "'filename' names no logo picture");
+    if (!fileOf(name)) return setError(QvStatus::failed, "The logo picture %s can't be opened", name);
     QvFrame colour, alpha;
     if (QvImage::loadFrame(colour, Any(name), &alpha) != QvStatus::ok || !colour.inited())
         return setError(QvStatus::failed, "The logo picture %s can't be read as a PNG", name);
