@@ -56,6 +56,36 @@ void weighWords(Byte* dst, const Byte* src, const uint32_t* scale, const uint32_
     for (; i < words; ++i) putWord(dst, i, (wordAt(src, i) * scale[i] + add[i]) >> 16);
 }
 
+void weighTens(Byte* dst, const Byte* src, const uint32_t* scale, const uint32_t* add, size_t words) {
+    size_t i = 0;
+#if QV_VECTORS
+    const hn::Repartition<uint32_t, D8> du32;
+    const size_t lanes = hn::Lanes(du32);
+    for (; i + lanes <= words; i += lanes) {
+        const auto three = hn::BitCast(du32, hn::LoadU(d8, src + 4 * i));
+        auto s0 = hn::Zero(du32), s1 = s0, s2 = s0, a0 = s0, a1 = s0, a2 = s0;
+        hn::LoadInterleaved3(du32, scale + 3 * i, s0, s1, s2);
+        hn::LoadInterleaved3(du32, add + 3 * i, a0, a1, a2);
+        const auto ten = hn::Set(du32, 1023);
+        const auto weighed = [](auto sample, auto s, auto a) {
+            return hn::ShiftRight<16>(hn::Add(hn::Mul(sample, s), a));
+        };
+        const auto w0 = weighed(hn::And(three, ten), s0, a0);
+        const auto w1 = weighed(hn::And(hn::ShiftRight<10>(three), ten), s1, a1);
+        const auto w2 = weighed(hn::And(hn::ShiftRight<20>(three), ten), s2, a2);
+        const auto joined = hn::Or(w0, hn::Or(hn::ShiftLeft<10>(w1), hn::ShiftLeft<20>(w2)));
+        hn::StoreU(hn::BitCast(d8, joined), d8, dst + 4 * i);
+    }
+#endif
+    for (; i < words; ++i) {
+        uint32_t three = 0, joined = 0;
+        std::memcpy(&three, src + 4 * i, 4);
+        for (size_t k = 0; k < 3; ++k)
+            joined |= ((three >> 10 * k & 1023) * scale[3 * i + k] + add[3 * i + k]) >> 16 << 10 * k;
+        std::memcpy(dst + 4 * i, &joined, 4);
+    }
+}
+
 #if QV_VECTORS
 
 // Sixteen tables of sixteen entries, of which each bit of the upper half byte halves the choice.
@@ -124,6 +154,11 @@ void weighBytes(Byte* dst, const Byte* src, const uint16_t* scale, const uint16_
 HWY_EXPORT(weighWords);
 void weighWords(Byte* dst, const Byte* src, const uint32_t* scale, const uint32_t* add, size_t words) {
     HWY_DYNAMIC_DISPATCH(weighWords)(dst, src, scale, add, words);
+}
+
+HWY_EXPORT(weighTens);
+void weighTens(Byte* dst, const Byte* src, const uint32_t* scale, const uint32_t* add, size_t words) {
+    HWY_DYNAMIC_DISPATCH(weighTens)(dst, src, scale, add, words);
 }
 
 HWY_EXPORT(lookUpBytes);

@@ -16,6 +16,10 @@ void weighBytes(Byte* dst, const Byte* src, const uint16_t* scale, const uint16_
 // dst = (src * scale + add) >> 16, scale 0 to 65536. The sum must fit 32 bits.
 void weighWords(Byte* dst, const Byte* src, const uint32_t* scale, const uint32_t* add, size_t words);
 
+// The same on three samples of 10 bits in each 32-bit word, the first in the lowest bits; three weights a
+// word. The upper two bits become 0.
+void weighTens(Byte* dst, const Byte* src, const uint32_t* scale, const uint32_t* add, size_t words);
+
 // dst = table[src] for the samples that `chosen` names, which has a bit for each place in a group of four,
 // the first sample's being bit 0; the other samples are copied.
 void lookUpBytes(Byte* dst, const Byte* src, const Byte* table, unsigned chosen, size_t bytes);

@@ -2,7 +2,6 @@
 
 #include <algorithm>
 #include <cstring>
-#include <limits>
 
 #include "builtin/kernels/samplerows.h"
 #include "core/engine/status.h"
@@ -73,6 +72,10 @@ size_t SampleLayout::rowSamples(const QvFrame& frame, int plane) const {
     return samples(plane, frame.width(plane));
 }
 
+uint32_t SampleLayout::largest(size_t sample) const {
+    return store == r565 && sample % pixelSamples == 1 ? 63 : (1u << bits) - 1;
+}
+
 std::ptrdiff_t SampleLayout::byteOffset(int plane, int pixel) const {
     const std::ptrdiff_t at = pixel;
     if (store == v210) return at / 6 * std::ptrdiff_t{groupBytes};
@@ -126,19 +129,19 @@ void SampleWeights::fade(size_t i, uint32_t level, uint32_t share) {
     }
 }
 
-// What is added can leave its range by the rounding of `laid` alone.
+// What is added can leave its range by the rounding of `laid` alone: the sum stays a sample.
 void SampleWeights::cover(size_t i, uint32_t laid, uint32_t black, uint32_t weight) {
-    if (layout_->wide()) {
-        const uint32_t share = 65536 - weight;
-        const int64_t most = int64_t{std::numeric_limits<uint32_t>::max()} - int64_t{65535} * share;
-        scale16_[i] = share;
-        add16_[i] = static_cast<uint32_t>(
-            std::clamp<int64_t>(int64_t{laid} * 65536 - int64_t{black} * share + 32768, 0, most));
+    const bool wide = layout_->wide();
+    const int64_t one = wide ? 65536 : 256, top = layout_->largest(i);
+    const int64_t share = wide ? 65536 - int64_t{weight} : 256 - int64_t{(weight + 128) >> 8};
+    const int64_t most = (top + 1) * one - 1 - top * share;
+    const int64_t add = std::clamp<int64_t>(int64_t{laid} * one - int64_t{black} * share + one / 2, 0, most);
+    if (wide) {
+        scale16_[i] = static_cast<uint32_t>(share);
+        add16_[i] = static_cast<uint32_t>(add);
     } else {
-        const int share = 256 - static_cast<int>((weight + 128) >> 8);
         scale8_[i] = static_cast<uint16_t>(share);
-        add8_[i] = static_cast<uint16_t>(std::clamp(
-            static_cast<int>(laid) * 256 - static_cast<int>(black) * share + 128, 0, 65535 - 255 * share));
+        add8_[i] = static_cast<uint16_t>(add);
     }
 }
 
@@ -148,6 +151,8 @@ void SampleWeights::apply(unsigned char* to, const unsigned char* from, size_t f
             return srk::weighBytes(to, from, scale8_.data() + first, add8_.data() + first, samples);
         case SampleLayout::words:
             return srk::weighWords(to, from, scale16_.data() + first, add16_.data() + first, samples);
+        case SampleLayout::v210:
+            return srk::weighTens(to, from, scale16_.data() + first, add16_.data() + first, samples / 3);
         default: break;
     }
     apart_.resize(samples);

@@ -23,7 +23,7 @@ struct SampleLayout {
 
     unsigned fourcc;
     Store store;
-    uint8_t bits;                      // of a sample
+    uint8_t bits;                      // of a sample; the green of R565 has one more
     uint8_t perPixel;                  // samples of plane 0 for each pixel
     std::array<SampleRole, 4> first4;  // of a row of plane 0; it goes on in this way. Other planes are chroma
 
@@ -32,6 +32,7 @@ struct SampleLayout {
     }
     uint32_t black(SampleRole role) const;
     uint32_t white(SampleRole role) const;
+    uint32_t largest(size_t sample) const;  // value that a sample of a row can hold
     // Whether rows are weighed as words; otherwise as bytes.
     bool wide() const { return store != bytes; }
     // Samples in the first `pixels` pixels of plane 0, or in as many of another plane.

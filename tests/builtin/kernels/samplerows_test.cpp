@@ -70,7 +70,21 @@ void check(size_t n, bool inPlace, const Weights& w, const std::vector<uint16_t>
                 const bool looked = chosen >> i % 4 & 1;
                 return looked ? std::pair<unsigned, unsigned>{table8[b], table16[s]} : std::pair{b, s};
             });
-    for (const Guarded* row : {&in8, &in16, &out8, &out16}) EXPECT_TRUE(row->frontIntact());
+    Guarded in10(4 * (n / 3), 3), out10(4 * (n / 3));
+    Guarded& to10 = inPlace ? in10 : out10;
+    std::vector<uint32_t> add(w.add16);
+    for (size_t i = 0; i < n; ++i) add[i] = (1024u << 16) - 1 - 1023 * w.scale16[i];
+    const std::vector<Byte> was(in10.data(), in10.data() + 4 * (n / 3));
+    weighTens(to10.data(), in10.data(), w.scale16.data(), add.data(), n / 3);
+    for (size_t i = 0; i < n / 3 * 3; ++i) {
+        const auto tens = [&](const Byte* row) {
+            uint32_t word;
+            std::memcpy(&word, row + i / 3 * 4, 4);
+            return word >> 10 * (i % 3) & 1023;
+        };
+        ASSERT_EQ(tens(to10.data()), (tens(was.data()) * w.scale16[i] + add[i]) >> 16) << n << " " << i;
+    }
+    for (const Guarded* row : {&in8, &in16, &out8, &out16, &in10, &out10}) EXPECT_TRUE(row->frontIntact());
 }
 
 }  // namespace
