@@ -8,6 +8,9 @@
 #include "core/caption/qvcc.h"
 #include "core/engine/init.h"
 #include "core/filter/filtersstate.h"
+#include "core/filter/jobdescription.h"
+#include "core/filter/qvprocesspipe.h"
+#include "core/filter/qvprocessutil.h"
 #include "core/transcode/translink.h"
 #include "tests/support/fake_streams.h"
 #include "tests/support/temp_folder.h"
@@ -106,5 +109,55 @@ TEST_F(RateJobs, CaptionsArriveOnceInOrderAndInTime) {
         const std::vector<int>& numbers = pipe.video.numbers;
         EXPECT_EQ(numbers.size(), static_cast<std::size_t>(link.totalOutFrames()));
         for (std::size_t i = 0; i < numbers.size(); ++i) ASSERT_EQ(numbers[i], static_cast<int>(i));
+    }
+}
+
+TEST_F(RateJobs, TheChainCountsTheBobbersShare) {
+    const struct {
+        QvFramerate out;
+        int front, outHeight;
+        const char* chain;
+    } rows[] = {
+        {QvFramerate::f50p(), 1, 48, "bobber"},
+        {QvFramerate::f50p(), 0, 48, "bobber"},
+        // No field is dropped, though half the lines would do.
+        {QvFramerate::f50p(), 1, 24, "bobber scaler"},
+        {QvFramerate::f50p(), 0, 24, "scaler bobber"},
+        {QvFramerate::f25p(), 1, 24, "bobber frconvert scaler"},
+        {QvFramerate::f59p(), 1, 24, "bobber scaler frconvert"},
+        {QvFramerate::f25p(), 0, 48, "frconvert bobber"},
+    };
+    for (const auto& row : rows) {
+        VideoJobDescription job;
+        job.inWidth = job.outWidth = 64;
+        job.inHeight = 48;
+        job.outHeight = row.outHeight;
+        job.inFOURCC = job.outFOURCC = QvFourcc::I420;
+        job.inFramerate = QvFramerate::f50i();
+        job.outFramerate = row.out;
+        FiltersState state;
+        state.appendFilter("bobber", AnyDict("name", "bobber", "_on", 1, "_front", row.front));
+        job.filters = state;
+        const std::unique_ptr<QvVProcessPipe> pipe(QvProcessUtil::createVideoPipe(job));
+        std::string chain;
+        for (int i = 0; i < pipe->nrFilters(); ++i)
+            chain += (i ? " " : "") + std::string(pipe->filter(i)->name());
+        EXPECT_EQ(chain, row.chain);
+        int written = 0;
+        for (int n = 0; n < 50; ++n) {
+            QvFrame frame;
+            frame.init(QvFourcc::I420, 64, 48);
+            frame.setBlack();
+            frame.framerate = job.inFramerate;
+            frame.frameNr = n;
+            EXPECT_EQ(pipe->write(frame), 0);
+            for (; pipe->process(nullptr, 0) == 0; pipe->next()) {
+                EXPECT_EQ(pipe->frame()->frameNr, written++);
+                EXPECT_NEAR(pipe->frame()->framerate.rate(), row.out.rate().ratio(), 1e-6);
+                EXPECT_EQ(pipe->frame()->framerate.interlaced(), 0);
+            }
+        }
+        EXPECT_NEAR(written, 2 * row.out.rate().ratio(), 1) << chain;
+        pipe->close();
     }
 }
