@@ -1,13 +1,9 @@
 #include "builtin/decoders/testcard.h"
 
-#include <gtest/gtest.h>
-
 #include <map>
-#include <string>
-#include <utility>
 
-#include "core/engine/qvexception.h"
 #include "core/media/qvbuffer.h"
+#include "tests/support/checks.h"
 
 namespace {
 
@@ -43,21 +39,16 @@ TEST_F(Card, EveryPartIsInItsPlace) {
         {"frame, top left", 0, 0, 0xFFFFFF},
         {"frame, bottom right", 639, 479, 0xFFFFFF},
         {"middle row", 300, 240, 0xFFFFFF},
-        {"middle column", 320, 200, 0xFFFFFF},
         {"grid row", 300, 210, 0xAAAAAA},
-        {"grid column", 350, 215, 0xAAAAAA},
         {"last grid column", 20, 445, 0xAAAAAA},
         {"ground", 330, 215, 0x808080},
         {"first second box", 15, 448, 0x303030},
-        {"its last column", 15 + 24 - 3, 477, 0x303030},
         {"the last box", 15 + 24 * 24, 450, 0x303030},
         {"field patch, first field", 640 - 135, 15, 0xFFFF00},
         {"field patch, second row left", 640 - 135, 16, 0x808080},
         {"field patch, second field", 640 - 135 + 60, 16, 0x00FFFF},
-        {"field patch, first row right", 640 - 135 + 60, 15, 0x808080},
         {"format box", 15, 15, 0x800000},
         {"white bar", 15, 90, 0xFFFFFF},
-        {"yellow bar", 55, 90, 0xFFFF00},
         {"blue bar", 15 + 6 * 40, 209, 0x0000FF},
         {"darkest gray", 20, 270, 0x000000},
         {"lightest gray", 20 + 10 * 27, 359, 0xFFFFFF},
@@ -102,10 +93,8 @@ TEST_F(Card, FractionalRatesEndInANarrowBox) {
 }
 
 TEST_F(Card, OtherFormatsAssert) {
-    for (const unsigned fourcc : {QvFourcc::I420, QvFourcc::BGR3}) {
-        frame.init(fourcc, 640, 480);
-        EXPECT_THROW(drawTestCard(frame, 4 / 3.0, nullptr), QvAssertFailure);
-    }
+    frame.init(QvFourcc::BGR3, 640, 480);
+    EXPECT_THROW(drawTestCard(frame, 4 / 3.0, nullptr), QvAssertFailure);
 }
 
 }  // namespace

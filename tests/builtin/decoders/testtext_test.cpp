@@ -3,12 +3,8 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
-#include <string>
 
-#include "core/arch/platform.h"
-#include "core/media/qvbuffer.h"
 #include "core/media/qvgeometry.h"
-#include "core/value/any.h"
 #include "tests/support/pictures.h"
 #include "tests/support/platform_scope.h"
 

@@ -1,11 +1,7 @@
 #include "builtin/decoders/wavdec.h"
 
-#include <gtest/gtest.h>
-
-#include <string>
-
-#include "core/engine/qvexception.h"
-#include "core/media/qvbuffer.h"
+#include "tests/support/checks.h"
+#include "tests/support/pictures.h"
 #include "tests/support/temp_folder.h"
 #include "tests/support/wav_bytes.h"
 
@@ -22,16 +18,11 @@ class Wav : public testing::Test {
     // Everything from the present position on, read in blocks of `block` samples.
     std::string readAll(int block) {
         std::string all;
-        while (true) {
-            const int count = decoder.readSamples(block, 0);
-            if (count <= 0) {
-                last = count;
-                return all;
-            }
-            const QvPcm& pcm = *decoder.getAudioPtr(0);
-            EXPECT_EQ(count, pcm.samples());
-            all.append(reinterpret_cast<const char*>(pcm.ptr(0)), static_cast<std::size_t>(pcm.bytes()));
+        while ((last = decoder.readSamples(block, 0)) > 0) {
+            EXPECT_EQ(last, decoder.getAudioPtr(0)->samples());
+            all += soundBytes(*decoder.getAudioPtr(0));
         }
+        return all;
     }
 
     TempFolder folder;
@@ -83,7 +74,11 @@ TEST_F(Wav, FindsItsChunksAmongOthers) {
     const std::string data = "\x01\x02\x03\x04\x05\x06";
     const std::string dataChunk = wavChunk("data", data);
     const std::string extended = wavChunk("fmt ", wavExtensible(1, 1, 8000, 8, 4));
-    const std::string unpadded = "LIST" + leBytes(3, 4) + "abc";
+    const std::string unpadded = "LIST" + leBytes(3, 4) + "abc", unknown = "\xFF\xFF\xFF\xFF";
+    const std::string rf64 =
+        "RF64" + unknown + "WAVE" +
+        wavChunk("ds64", leBytes(100, 8) + leBytes(6, 8) + leBytes(6, 8) + leBytes(0, 4)) + format + "data" +
+        unknown + data + "tail";
     const struct {
         const char* what;
         std::string file;
@@ -95,17 +90,11 @@ TEST_F(Wav, FindsItsChunksAmongOthers) {
         {"an odd one behind", riff(format + wavChunk("LIST", "abc") + dataChunk)},
         {"behind, without padding", riff(format + unpadded + dataChunk)},
         {"the word in a text", riff(format + wavChunk("LIST", "ISFTdata\x02\0\0\0") + dataChunk)},
-        {"a format with an extension",
-         riff(wavChunk("fmt ", wavFormat(1, 1, 8000, 8) + leBytes(0, 2)) + dataChunk)},
         {"extensible", riff(extended + dataChunk)},
         {"chunks behind the data", riff(format + dataChunk + wavChunk("LIST", "INFOabcd"))},
         {"a far chunk", riff(format + wavChunk("bext", std::string(90000, 'd')) + dataChunk)},
         {"rubbish that is no chunk", riff(format + "xy" + dataChunk)},
-        {"64-bit sizes",
-         "RF64\xFF\xFF\xFF\xFF"
-         "WAVE" +
-             wavChunk("ds64", leBytes(100, 8) + leBytes(6, 8) + leBytes(6, 8) + leBytes(0, 4)) + format +
-             "data\xFF\xFF\xFF\xFF" + data + "tail"},
+        {"64-bit sizes", rf64},
     };
     for (const auto& c : cases) {
         ASSERT_EQ(open(c.file), 0) << c.what << ": " << decoder.errorDesc();

@@ -189,12 +189,9 @@ TEST_F(RawVideo, RefusesWhatDoesNotFit) {
     EXPECT_TRUE(out_.data.empty());
     EXPECT_EQ(enc().writeFrame(&good), 0);
     EXPECT_EQ(enc().close(), 0);
-    for (const auto& [name, value] : {std::pair<const char*, Any>("type", 1234),
-                                      {"type", "I420"},
-                                      {"width", 0},
-                                      {"width", -4},
-                                      {"width", 1 << 30},
-                                      {"framerate", 0}})
+    const std::pair<const char*, Any> rows[] = {{"type", 1234}, {"type", "I420"},   {"width", 0},
+                                                {"width", -4},  {"width", 1 << 30}, {"framerate", 0}};
+    for (const auto& [name, value] : rows)
         EXPECT_EQ(enc().setParam(name, value), QvStatus::invalidParam) << name;
     EXPECT_EQ(get("width"), 64);
     EXPECT_EQ(get("_outFrameSize"), 64 * 48 * 3 / 2);

@@ -1,18 +1,12 @@
-#include <gtest/gtest.h>
-
 #include <cstring>
 #include <functional>
-#include <map>
-#include <memory>
 
-#include "core/encode/qvencodepipe.h"
-#include "core/engine/init.h"
-#include "core/engine/qvexception.h"
 #include "core/engine/qvutil.h"
 #include "core/preset/qvprofile.h"
 #include "core/stream/qvbufstrm.h"
-#include "tests/support/pictures.h"
-#include "tests/support/temp_folder.h"
+#include "tests/support/checks.h"
+#include "tests/support/output_pipe.h"
+#include "tests/support/wav_bytes.h"
 
 namespace {
 
@@ -25,10 +19,11 @@ class AviReader {
         size_t data, bytes;
     };
     struct Stream {
-        std::string type, handler, format;
+        std::string type, handler;
         unsigned scale, rate, length, largest, unitBytes;
-        std::vector<Chunk> chunks;    // by the super index
-        std::vector<unsigned> units;  // that each of its places covers
+        std::string format = {};
+        std::vector<Chunk> chunks = {};    // by the super index
+        std::vector<unsigned> units = {};  // that each of its places covers
     };
 
     explicit AviReader(std::string bytes) : bytes_(std::move(bytes)) {
@@ -91,16 +86,8 @@ class AviReader {
             microseconds = word(0), firstFrames = word(16), width = word(32), height = word(36);
             declared_ = word(24);
         } else if (c.id == "strh") {
-            streams.push_back({text(c.data),
-                               text(c.data + 4),
-                               "",
-                               word(20),
-                               word(24),
-                               word(32),
-                               word(36),
-                               word(44),
-                               {},
-                               {}});
+            streams.push_back(
+                {text(c.data), text(c.data + 4), word(20), word(24), word(32), word(36), word(44)});
         } else if (c.id == "strf") {
             streams.back().format = bytes_.substr(c.data, c.bytes);
         } else if (c.id == "indx") {
@@ -140,38 +127,14 @@ class AviReader {
     std::vector<Chunk> super_;
 };
 
-class RawAvi : public testing::Test {
+class RawAvi : public OutputPipe {
   protected:
-    RawAvi() {
-        init_wrapper(nullptr);
-        pipe_.reset(QvEncodePipe::create());
+    RawAvi() : OutputPipe("out.avi") {
         EXPECT_EQ(pipe_->applyPreset(QvProfile::aviRaw, 0), 0);
         pipe_->clearStreams();
         pipe_->setFilename(Any(folder_.file("out.avi").c_str()));
     }
-    ~RawAvi() override {
-        pipe_.reset();
-        cleanup_wrapper();
-    }
-
-    void video(unsigned type, int width, int height, const QvFramerate& rate = QvFramerate(25.0)) {
-        const int nr = pipe_->addVideoStream("rawvenc");
-        ASSERT_GE(nr, 0);
-        for (const auto& [name, value] : std::map<const char*, Any>{
-                 {"type", static_cast<int>(type)}, {"width", width}, {"height", height}, {"framerate", rate}})
-            ASSERT_EQ(pipe_->videoEncoder(nr)->setParam(name, value), 0);
-    }
-    void audio(int channels, int bits, int samplerate) {
-        const int nr = pipe_->addAudioStream("rawaenc");
-        ASSERT_GE(nr, 0);
-        for (const auto& [name, value] : std::map<const char*, Any>{
-                 {"channels", channels}, {"bitsPerSample", bits}, {"samplerate", samplerate}})
-            ASSERT_EQ(pipe_->audioEncoder(nr)->setParam(name, value), 0);
-    }
-    AviReader read() { return AviReader(TempFolder::read(folder_.file("out.avi"))); }
-
-    TempFolder folder_;
-    std::unique_ptr<QvEncodePipe> pipe_;
+    AviReader readAvi() { return AviReader(read("out.avi")); }
 };
 
 // What a picture has to be in the file, pixel by pixel.
@@ -220,32 +183,25 @@ TEST_F(RawAvi, PicturesOfEachType) {
         for (const auto& [width, height] : {std::pair{64, 32}, {51, 35}, {1500, 300}}) {
             SCOPED_TRACE(testing::Message() << row.handler << row.bits << " " << width << "x" << height);
             pipe_->clearStreams();
-            video(row.type, width, height);
+            addVideo(row.type, width, height);
             ASSERT_EQ(pipe_->open(), 0) << pipe_->errorDesc();
-            std::vector<std::string> expected;
+            Texts expected;
             for (unsigned i = 0; i < 3; ++i) {
-                QvFrame frame = makePicture(row.type, width, height, i);
-                ASSERT_EQ(pipe_->writeFrame(&frame, 0), 0);
-                expected.push_back(row.expected(frame, width));
+                writePicture(i);
+                expected.push_back(row.expected(picture(i), width));
             }
             ASSERT_EQ(pipe_->close(), 0);
-            const auto avi = read();
+            const auto avi = readAvi();
             ASSERT_EQ(avi.streams.size(), 1u);
             const auto& stream = avi.streams[0];
             EXPECT_EQ(stream.handler, row.handler);
             ASSERT_EQ(stream.chunks.size(), 3u);
             for (size_t i = 0; i < 3; ++i) EXPECT_TRUE(avi.data(stream.chunks[i]) == expected[i]);
-            const auto field = [&](size_t at, size_t bytes) {
-                unsigned value = 0;
-                std::memcpy(&value, stream.format.data() + at, bytes);
-                return value;
-            };
             ASSERT_EQ(stream.format.size(), 40u);
-            EXPECT_EQ(field(4, 4), static_cast<unsigned>(width));
-            EXPECT_EQ(field(8, 4), static_cast<unsigned>(height));
-            EXPECT_EQ(field(14, 2), static_cast<unsigned>(row.bits));
-            EXPECT_EQ(field(16, 4), row.compression);
-            EXPECT_EQ(field(20, 4), expected[0].size());
+            EXPECT_EQ(stream.format.substr(4, 20),
+                      leBytes(unsigned(width), 4) + leBytes(unsigned(height), 4) + leBytes(1, 2) +
+                          leBytes(unsigned(row.bits), 2) + leBytes(row.compression, 4) +
+                          leBytes(expected[0].size(), 4));
             EXPECT_EQ(stream.largest, expected[0].size());
         }
 }
@@ -256,27 +212,20 @@ TEST_F(RawAvi, SegmentsAndInterleaving) {
     const QvFramerate ntsc(QvRatio(30000, 1001));
     pipe_->getMuxer()->setParam("riffBytes", 20000);
     pipe_->getMuxer()->setParam("segments", 64);
-    video(QvFourcc::YUYV, 32, 32, ntsc);
-    audio(1, 8, rate);
-    audio(2, 16, 48000);
+    addVideo(QvFourcc::YUYV, 32, 32, ntsc);
+    addAudio(1, 8, rate);
+    addAudio(2, 16, 48000);
     ASSERT_EQ(pipe_->open(), 0) << pipe_->errorDesc();
     std::string pictures, mono, stereo;
-    const auto sound = [&](int nr, int count, std::string& all) {
-        QvPcm pcm;
-        fillSound(pcm, count, nr + 1, nr + 1, nr ? 48000 : rate, static_cast<unsigned>(all.size()));
-        ASSERT_EQ(pipe_->writePcm(&pcm, nr), 0);
-        all += soundBytes(pcm);
-    };
-    for (int i = 0; i < frames; ++i) {
-        QvFrame frame = makePicture(QvFourcc::YUYV, 32, 32, static_cast<unsigned>(i));
-        ASSERT_EQ(pipe_->writeFrame(&frame, 0), 0);
-        pictures += pictureBytes(frame);
-        if (i % 7 == 0) sound(0, static_cast<int>(QvUtil::samplesForFrames(7, ntsc, rate)) + 1, mono);
-        for (const int part : {1, 1600}) sound(1, part, stereo);
+    const int perSeven = static_cast<int>(QvUtil::samplesForFrames(7, ntsc, rate)) + 1;
+    for (unsigned i = 0; i < frames; ++i) {
+        pictures += writePicture(i);
+        if (i % 7 == 0) mono += writeSound(perSeven, i, 0);
+        for (const int part : {1, 1600}) stereo += writeSound(part, i, 1);
     }
     ASSERT_EQ(pipe_->close(), 0);
 
-    const auto avi = read();
+    const auto avi = readAvi();
     EXPECT_GT(avi.riffs, 10);
     EXPECT_LE(avi.longest, 20000u + 64 * 16 * 3 + 1000);  // the first holds the headers, too
     ASSERT_EQ(avi.streams.size(), 3u);
@@ -325,15 +274,13 @@ TEST_F(RawAvi, SoundFormats) {
          {std::tuple{1, 8, 1}, {2, 16, 1}, {2, 24, 0xFFFE}, {6, 16, 0xFFFE}, {1, 20, 0xFFFE}}) {
         SCOPED_TRACE(testing::Message() << channels << " channels, " << bits << " bits");
         pipe_->clearStreams();
-        audio(channels, bits, 48000);
+        addAudio(channels, bits, 48000);
         ASSERT_EQ(pipe_->open(), 0);
-        QvPcm pcm;
-        fillSound(pcm, 100001, channels, (bits + 7) / 8, 48000);
-        ASSERT_EQ(pipe_->writePcm(&pcm, 0), 0);
+        const std::string given = writeSound(100001, 1);
         ASSERT_EQ(pipe_->close(), 0);
-        const auto avi = read();
+        const auto avi = readAvi();
         ASSERT_EQ(avi.streams.size(), 1u);
-        EXPECT_TRUE(avi.all(0) == soundBytes(pcm));
+        EXPECT_TRUE(avi.all(0) == given);
         EXPECT_EQ(avi.streams[0].length, 100001u);
         const std::string& format = avi.streams[0].format;
         EXPECT_EQ(format.size(), tag == 1 ? 18u : 40u);
@@ -348,14 +295,14 @@ TEST_F(RawAvi, SoundFormats) {
 TEST_F(RawAvi, WhatItCanNotHold) {
     for (const auto& [type, width] : {std::pair{QvFourcc::GRAY, 32}, {QvFourcc::ARGB, 32}}) {
         pipe_->clearStreams();
-        video(type, width, 32);
+        addVideo(type, width, 32);
         EXPECT_EQ(pipe_->open(), QvStatus::failed);
         EXPECT_NE(std::string(pipe_->errorDesc()).find(qvFourccText(type).data()), std::string::npos);
     }
     pipe_->clearStreams();
     pipe_->getMuxer()->setParam("segments", 3);
     pipe_->getMuxer()->setParam("riffBytes", 20000);
-    video(QvFourcc::BGR4, 64, 64);
+    addVideo(QvFourcc::BGR4, 64, 64);
     ASSERT_EQ(pipe_->open(), 0);
     QvFrame frame = makePicture(QvFourcc::BGR4, 64, 64);
     int written = 0;
@@ -367,7 +314,7 @@ TEST_F(RawAvi, WhatItCanNotHold) {
     pipe_->clearStreams();
     EXPECT_THROW(pipe_->open(), QvAssertFailure);
     pipe_->setFilename(Any("/dev/full"));
-    video(QvFourcc::BGR4, 64, 64);
+    addVideo(QvFourcc::BGR4, 64, 64);
     int result = pipe_->open();
     for (int i = 0; i < 1000 && result == 0; ++i) result = pipe_->writeFrame(&frame, 0);
     EXPECT_NE(result, 0);
@@ -377,12 +324,10 @@ TEST_F(RawAvi, WhatItCanNotHold) {
 // Encoders that ask for room and confirm it, in pieces that do not match the pictures; and a worker that
 // writes pictures while sound comes from here.
 TEST_F(RawAvi, OtherWaysOfWriting) {
-    video(QvFourcc::v210, 50, 20);
-    audio(2, 16, 48000);
+    addVideo(QvFourcc::v210, 50, 20);
+    addAudio(2, 16, 48000);
     ASSERT_EQ(pipe_->open(), 0);
-    const size_t picture = 128 * 2 * 20;
-    std::string data(3 * picture, 0);
-    for (size_t i = 0; i < data.size(); ++i) data[i] = static_cast<char>(i * 7 + i / 251);
+    std::string data = patternBytes(3 * 128 * 2 * 20);
     auto* out = pipe_->videoStream(0)->bitstream->input();
     for (size_t at = 0; at < data.size();) {
         const auto n = static_cast<unsigned>(std::min<size_t>({777, out->usable(out), data.size() - at}));
@@ -393,7 +338,7 @@ TEST_F(RawAvi, OtherWaysOfWriting) {
         at += n;
     }
     ASSERT_EQ(pipe_->close(), 0);
-    EXPECT_TRUE(read().all(0) == data);
+    EXPECT_TRUE(readAvi().all(0) == data);
 
     ASSERT_EQ(pipe_->open(), 0);
     out = pipe_->videoStream(0)->bitstream->input();
@@ -401,22 +346,17 @@ TEST_F(RawAvi, OtherWaysOfWriting) {
     EXPECT_NE(pipe_->close(), 0);  // a part of a picture
 
     pipe_->clearStreams();
-    video(QvFourcc::YUYV, 64, 32);
+    addVideo(QvFourcc::YUYV, 64, 32);
     pipe_->videoEncoder(0)->setParam("accelerationOn", 1);
-    audio(2, 16, 48000);
+    addAudio(2, 16, 48000);
     ASSERT_EQ(pipe_->open(), 0);
     std::string pictures, sound;
     for (unsigned i = 0; i < 100; ++i) {
-        QvFrame frame = makePicture(QvFourcc::YUYV, 64, 32, i);
-        ASSERT_EQ(pipe_->writeFrame(&frame, 0), 0);
-        pictures += pictureBytes(frame);
-        QvPcm pcm;
-        fillSound(pcm, 1920, 2, 2, 48000, i);
-        ASSERT_EQ(pipe_->writePcm(&pcm, 0), 0);
-        sound += soundBytes(pcm);
+        pictures += writePicture(i);
+        sound += writeSound(1920, i);
     }
     ASSERT_EQ(pipe_->close(), 0);
-    const auto avi = read();
+    const auto avi = readAvi();
     EXPECT_TRUE(avi.all(0) == pictures);
     EXPECT_TRUE(avi.all(1) == sound);
 }

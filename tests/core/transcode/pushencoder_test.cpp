@@ -1,67 +1,41 @@
 #include "core/transcode/pushencoder.h"
 
-#include <gtest/gtest.h>
-
 #include <atomic>
 #include <thread>
 
-#include "core/encode/qvencodepipe.h"
-#include "core/engine/qvexception.h"
 #include "core/engine/qvutil.h"
 #include "core/transcode/processparams.h"
+#include "tests/support/checks.h"
 #include "tests/support/failing_codecs.h"
 #include "tests/support/log_capture.h"
-#include "tests/support/pictures.h"
-#include "tests/support/temp_folder.h"
+#include "tests/support/output_pipe.h"
 
 namespace {
 
 constexpr int width = 64, height = 48, samplerate = 48000;
 const QvFramerate rate(QvRatio(30000, 1001));
+const AnyDict videoFormat("FOURCC", static_cast<int>(QvFourcc::I420), "width", width, "height", height,
+                          "framerate", rate);
 
-class Pushing : public testing::Test {
+class Pushing : public OutputPipe {
   protected:
-    Pushing() {
-        init_wrapper(nullptr);
-        pipe_.reset(QvEncodePipe::create());
-        pipe_->clearStreams();
-        pipe_->setFilename(Any(folder_.file("out.x").c_str()));
-    }
-    ~Pushing() override {
-        pipe_.reset();
-        cleanup_wrapper();
-    }
-
-    static AnyDict videoFormat() {
-        return AnyDict("FOURCC", static_cast<int>(QvFourcc::I420), "width", width, "height", height,
-                       "framerate", rate);
-    }
-    static AnyDict audioFormat(int bufferLength = 48000) {
-        return AnyDict("samplerate", samplerate, "channels", 2, "bitsPerSample", 16, "bufferLength",
-                       bufferLength);
-    }
     void add(QvPushEncoder& push, bool video, bool audio, int bufferLength = 48000) {
-        AnyDict pictures = videoFormat(), sound = audioFormat(bufferLength);
+        AnyDict pictures = videoFormat;
+        AnyDict sound("samplerate", samplerate, "channels", 2, "bitsPerSample", 16, "bufferLength",
+                      bufferLength);
         ASSERT_EQ(push.setEncoder(pipe_.get()), 0);
+        if (video) addVideo(QvFourcc::I420, width, height, rate);
         if (video) {
-            ASSERT_EQ(pipe_->addVideoStream("rawvenc"), 0);
-            pipe_->setParam("video0", AnyDict("type", static_cast<int>(QvFourcc::I420), "width", width,
-                                              "height", height, "framerate", rate));
             ASSERT_EQ(push.addVideoStream(pictures, nullptr), 0);
         }
+        if (audio) addAudio(2, 16, samplerate);
         if (audio) {
-            ASSERT_EQ(pipe_->addAudioStream("rawaenc"), 0);
             ASSERT_EQ(push.addAudioStream(sound, nullptr), 0);
         }
     }
     static void waitUntil(QvPushEncoder& push, bool (QvPushEncoder::*needs)(int) const) {
         while (!(push.*needs)(0) && push.running()) push.process();
     }
-    static QvFrame picture(unsigned seed) { return makePicture(QvFourcc::I420, width, height, seed); }
-    std::string file(const char* name) { return TempFolder::read(folder_.file(name)); }
-
-    TempFolder folder_;
-    std::unique_ptr<QvEncodePipe> pipe_;
 };
 
 void writeSamples(QvPushEncoder& push, int count, unsigned seed, std::string& all) {
@@ -111,13 +85,12 @@ TEST_F(Pushing, EverythingArrives) {
     waitUntil(push, &QvPushEncoder::needsVideo);
     EXPECT_FALSE(push.running());
     EXPECT_EQ(push.close(false), 0);
-    EXPECT_TRUE(log.contains("[PuhEncoder::loop] thread exiting"));
     EXPECT_TRUE(log.contains("[pushencoder] total out frames 60"));
     ASSERT_EQ(pipe_->close(), 0);
-    EXPECT_EQ(file("out.raw"), pictures);
+    EXPECT_EQ(read("out.raw"), pictures);
     const auto samples = static_cast<size_t>(QvUtil::samplesForFrames(frames, rate, samplerate));
     ASSERT_GT(sound.size(), samples * 4);
-    EXPECT_EQ(file("out.wav").substr(80), sound.substr(0, samples * 4));
+    EXPECT_EQ(read("out.wav").substr(80), sound.substr(0, samples * 4));
 }
 
 TEST_F(Pushing, SoundAlone) {
@@ -134,7 +107,7 @@ TEST_F(Pushing, SoundAlone) {
     waitUntil(push, &QvPushEncoder::needsAudio);
     EXPECT_EQ(push.close(false), 0);
     ASSERT_EQ(pipe_->close(), 0);
-    EXPECT_EQ(file("out.wav").substr(80), sound);
+    EXPECT_EQ(read("out.wav").substr(80), sound);
 }
 
 TEST_F(Pushing, AnEndMarkDropsWhatIsQueued) {
@@ -148,19 +121,19 @@ TEST_F(Pushing, AnEndMarkDropsWhatIsQueued) {
     waitUntil(push, &QvPushEncoder::needsVideo);
     EXPECT_EQ(push.close(false), 0);
     EXPECT_EQ(pipe_->close(), 0);
-    EXPECT_EQ(file("out.raw"), "");
+    EXPECT_EQ(read("out.raw"), "");
 }
 
 TEST_F(Pushing, FormatsAreChecked) {
-    struct Row {
+    const struct {
         int rate, channels, bytes, bits;
         int logged;  // lines
-    };
+    } rows[] = {{96000, 2, 0, 16, 0}, {96001, 2, 0, 16, 1}, {0, 2, 0, 16, 1},
+                {48000, 0, 0, 16, 1}, {0, 0, 5, 0, 3},      {48000, 1, 4, 0, 0},
+                {48000, 1, 0, 20, 0}, {48000, 1, 2, 24, 1}, {48000, 1, 0, 0, 1}};
     QvPushEncoder push;
-    for (const auto& row : {Row{96000, 2, 0, 16, 0}, Row{96001, 2, 0, 16, 1}, Row{0, 2, 0, 16, 1},
-                            Row{48000, 0, 0, 16, 1}, Row{0, 0, 5, 0, 3}, Row{48000, 1, 4, 0, 0},
-                            Row{48000, 1, 0, 20, 0}, Row{48000, 1, 2, 24, 1}, Row{48000, 1, 0, 0, 1}}) {
-        SCOPED_TRACE(testing::Message() << row.rate << " " << row.channels << " " << row.bits);
+    for (const auto& row : rows) {
+        SCOPED_TRACE(&row - rows);
         LogCapture log;
         AnyDict format("samplerate", row.rate, "channels", row.channels);
         if (row.bytes) format.set("bytesPerSample", row.bytes);
@@ -171,10 +144,9 @@ TEST_F(Pushing, FormatsAreChecked) {
     }
     AnyDict odd("samplerate", 48000, "channels", 1, "bitsPerSample", 17);
     EXPECT_THROW(push.addAudioStream(odd, nullptr), QvAssertFailure);
-    AnyDict incomplete = videoFormat();
+    AnyDict complete = videoFormat, incomplete = videoFormat;
     incomplete.remove("framerate");
     EXPECT_EQ(push.addVideoStream(incomplete, nullptr), QvStatus::failed);
-    AnyDict complete = videoFormat();
     EXPECT_EQ(push.addVideoStream(complete, nullptr), 0);
     QvFrame other = makePicture(QvFourcc::YUYV, width, height), none;
     EXPECT_EQ(push.writeFrame(&other, 0), QvStatus::invalidArgument);
@@ -211,62 +183,54 @@ TEST_F(Pushing, CloseAtEveryMoment) {
         }
         if (moment / 2 == 2) waitUntil(push, &QvPushEncoder::needsAudio);
         if (moment / 2 == 3) writeSamples(push, 10000, 1, sound);
-        if (moment / 2 == 4)
+        if (moment / 2 == 4) {
             writer = std::thread([&] {
                 QvFrame own = picture(2);
-                while (!stop) {
+                while (!stop && sound.size() < (8u << 20)) {
                     push.writeFrame(&own, 0);
                     writeSamples(push, 1602, 1, sound);
-                    if (sound.size() > (8u << 20)) break;
                 }
             });
-        if (moment / 2 == 4) push.process();
+            push.process();
+        }
         EXPECT_EQ(push.close(moment % 2), 0) << push.errorDesc();
         stop = true;
         if (writer.joinable()) writer.join();
         EXPECT_EQ(pipe_->close(), 0);
-        EXPECT_EQ(file("out.raw").size() % static_cast<size_t>(frame.total_bytes()), 0u);
+        EXPECT_EQ(read("out.raw").size() % static_cast<size_t>(frame.total_bytes()), 0u);
     }
 }
 
 TEST_F(Pushing, AFailingOutputIsTold) {
-    struct Row {
-        const char* at;
-        FailingOutputs::How how;
-    };
-    for (const auto& [at, how] :
-         {Row{"rawvenc.write", FailingOutputs::status}, Row{"rawvenc.write", FailingOutputs::assertion},
-          Row{"rawaenc.write", FailingOutputs::status}, Row{"rawaenc.write", FailingOutputs::assertion}}) {
-        SCOPED_TRACE(at);
-        const bool video = at[3] == 'v';
-        cleanup_wrapper();
-        init_wrapper(nullptr);
-        FailingOutputs outputs;
-        outputs.how = how;
-        outputs.failAt = at;
-        pipe_.reset(QvEncodePipe::create());
-        pipe_->clearStreams();
-        pipe_->setFilename(Any(folder_.file("out.x").c_str()));
-        QvPushEncoder push;
-        add(push, video, !video);
-        ASSERT_EQ(push.open(), 0);
-        ASSERT_EQ(push.start(), 0);
-        QvFrame frame = picture(1);
-        QvPcm sound;
-        fillSound(sound, 2000, 2, 2, samplerate);
-        int result = 0;
-        for (int i = 0; i < 1000 && result == 0; ++i) {
-            result = video ? push.writeFrame(&frame, 0) : push.writeSamples(&sound, 0);
-            if (result == 0) push.process();
+    for (const char* at : {"rawvenc.write", "rawaenc.write"})
+        for (const auto how : {FailingOutputs::status, FailingOutputs::assertion}) {
+            SCOPED_TRACE(at);
+            const bool video = at[3] == 'v';
+            pipe_.reset();
+            FailingOutputs outputs;
+            outputs.how = how;
+            outputs.failAt = at;
+            pipe_.reset(QvEncodePipe::create());
+            pipe_->clearStreams();
+            pipe_->setFilename(Any(folder_.file("out.x").c_str()));
+            QvPushEncoder push;
+            add(push, video, !video);
+            ASSERT_EQ(push.open(), 0);
+            ASSERT_EQ(push.start(), 0);
+            QvFrame frame = makePicture(QvFourcc::I420, width, height);
+            QvPcm sound;
+            fillSound(sound, 2000, 2, 2, samplerate);
+            int result = 0;
+            for (int i = 0; i < 1000 && result == 0; ++i) {
+                result = video ? push.writeFrame(&frame, 0) : push.writeSamples(&sound, 0);
+                if (result == 0) push.process();
+            }
+            EXPECT_LT(result, 0);
+            EXPECT_NE(std::string(push.errorDesc()).find(at), std::string::npos) << push.errorDesc();
+            EXPECT_EQ(push.close(false), result);
+            pipe_->abort();
+            pipe_.reset();
         }
-        EXPECT_LT(result, 0);
-        EXPECT_NE(std::string(push.errorDesc()).find(at), std::string::npos) << push.errorDesc();
-        EXPECT_EQ(push.close(false), result);
-        pipe_->abort();
-        pipe_.reset();
-    }
-    pipe_.reset();
-    init_wrapper(nullptr);
 }
 
 }  // namespace
