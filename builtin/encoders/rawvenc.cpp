@@ -3,8 +3,8 @@
 #include <algorithm>
 #include <climits>
 #include <cstring>
+#include <exception>
 #include <mutex>
-#include <system_error>
 
 #include "builtin/creators.h"
 #include "builtin/encoders/rawoutput.h"
@@ -76,7 +76,7 @@ int RawVideoEnc::remake(int width, int height, unsigned type) {
     height_ = height;
     type_ = type;
     frameBytes_ = type == QvFourcc::v210 ? rawvenc::v210Bytes(width, height) : shape.total_bytes();
-    havePicture_ = false;
+    last_ = nullptr;
     return QvStatus::ok;
 }
 
@@ -95,7 +95,7 @@ int RawVideoEnc::open() {
         stop_ = discard_ = false;
         try {
             worker_ = std::thread(&RawVideoEnc::work, this);
-        } catch (const std::system_error& error) {
+        } catch (const std::exception& error) {  // no thread, or no memory for one
             queue_.destroy();
             return setError(QvStatus::failed, "Can not start the writing thread: %s", error.what());
         }
@@ -116,9 +116,10 @@ int RawVideoEnc::writeFrame(QvFrame* frame) {
         return setError(QvStatus::invalidArgument, "A frame of %dx%d %s does not fit the output of %dx%d",
                         frame->planes() > 0 ? frame->width(0) : 0, frame->planes() > 0 ? frame->height(0) : 0,
                         frame->planes() > 0 ? frame->str_four_cc() : "no format", width_, height_);
+    if (worker_.joinable()) return enqueue(*frame);
+    last_ = nullptr;
     if (const int result = copyPacked(picture_, *frame)) return setError(result, "Out of memory");
-    havePicture_ = true;
-    if (worker_.joinable()) return enqueue(picture_);
+    last_ = &picture_;
     // A block that an output without a known fault does not give is a broken contract.
     const auto outcome = writeOut(picture_);
     const int result = report(outcome);
@@ -126,7 +127,7 @@ int RawVideoEnc::writeFrame(QvFrame* frame) {
     return result;
 }
 
-QvFrame* RawVideoEnc::lastFrame() { return havePicture_ ? &picture_ : nullptr; }
+QvFrame* RawVideoEnc::lastFrame() { return last_; }
 
 RawVideoEnc::Outcome RawVideoEnc::writeOut(const QvFrame& frame) {
     if (type_ != QvFourcc::v210) return writePicture(frame, frame.total_bytes());
@@ -198,6 +199,8 @@ int RawVideoEnc::enqueue(const QvFrame& frame) {
     const int copied = copyPacked(*slot, frame);
     lock.lock();
     if (copied != QvStatus::ok) return setError(copied, "Out of memory");
+    // The last to be taken for another picture: all slots that are empty by then have been so for longer.
+    last_ = slot;
     queue_.moveToFull();
     workReady_.notify_one();
     return QvStatus::ok;
@@ -243,12 +246,13 @@ int RawVideoEnc::finish(bool discard) {
             workReady_.notify_one();
         }
         worker_.join();
+        last_ = nullptr;
         queue_.destroy();
         result = report(failure_);
     }
     converter_.reset();
     picture_.destroy();
-    havePicture_ = false;
+    last_ = nullptr;
     setState(stateInitialised);
     return result;
 }

@@ -38,7 +38,8 @@ class RawVideoEnc : public QvVideoEncoder {
     int abort() override;
     // QvStatus::invalidArgument for a null frame and for one whose size or FOURCC is not what was set.
     int writeFrame(QvFrame* frame) override;
-    // The latest frame, packed; null before the first one and after close.
+    // The latest frame, packed; null before the first one and after close. With "accelerationOn" it is the
+    // one in the queue, which is not to be changed.
     QvFrame* lastFrame() override;
 
   private:
@@ -73,8 +74,8 @@ class RawVideoEnc : public QvVideoEncoder {
     int frameBytes_ = 0;  // of one packed frame, v210 as it is put out
     QvFramerate rate_{25.0};
     int profile_ = 0x1000065;
-    QvFrame picture_;  // the latest frame
-    bool havePicture_ = false;
+    QvFrame picture_;  // the latest frame without a worker
+    QvFrame* last_ = nullptr;
     bool getOut_ = false;
     bool accelerated_ = false;
     std::unique_ptr<QvVideoFilter> converter_;
