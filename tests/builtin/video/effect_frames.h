@@ -10,7 +10,7 @@
 #include <string>
 #include <utility>
 
-#include "core/media/qvframe.h"
+#include "builtin/video/samplelayout.h"
 #include "core/value/any.h"
 #include "tests/support/pictures.h"
 
@@ -32,7 +32,7 @@ struct OpenedEffect : Effect {
 
 inline std::string fourccName(unsigned fourcc) { return qvFourccText(fourcc).data(); }
 
-inline int planeRows(const QvFrame& frame, int plane) {
+inline int sampleRows(const QvFrame& frame, int plane) {
     return frame.plane_bytes(plane) / frame.stride(plane);
 }
 
@@ -46,21 +46,17 @@ inline std::string samplesOf(const QvFrame& frame) {
     for (int p = 0; p < frame.planes(); ++p) {
         const int bytes =
             frame.pixelBytes(p) > 0 ? frame.width(p) * frame.pixelBytes(p) : (frame.width() + 5) / 6 * 16;
-        for (int y = 0; y < planeRows(frame, p); ++y)
+        for (int y = 0; y < sampleRows(frame, p); ++y)
             all.append(reinterpret_cast<const char*>(rowOf(frame, p, y)), static_cast<size_t>(bytes));
     }
     return all;
 }
 
-// What an effect makes of a copy in place is what it makes of the frame that it is given.
+// What an effect makes of a frame in place is what it makes of one that it is given.
 template <class Effect>
-void sameInPlace(Effect&& written, Effect&& applied, const QvFrame& frame) {
-    QvFrame in = makePicture(frame.four_cc(), frame.width(), frame.height(), 7), copy;
-    std::memcpy(in.plane(), frame.plane(), static_cast<size_t>(in.total_bytes()));
-    copy = in;
-    std::memcpy(copy.plane(), in.plane(), static_cast<size_t>(in.total_bytes()));
-    const QvFrame& out = written.through(in);
-    EXPECT_TRUE(applied.applySupported());
+void sameInPlace(Effect&& written, Effect&& applied, QvFrame& frame) {
+    QvFrame copy = frame;
+    copySamples(copy, frame);
     EXPECT_EQ(applied.apply(copy), 0);
-    EXPECT_TRUE(samplesOf(out) == samplesOf(copy)) << frame.str_four_cc();
+    EXPECT_TRUE(samplesOf(written.through(frame)) == samplesOf(copy)) << frame.str_four_cc();
 }

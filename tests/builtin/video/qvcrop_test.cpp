@@ -65,26 +65,22 @@ TEST(QvCrop, BoxesFollowTheModes) {
 TEST(QvCrop, LimitsAreToldAndHeld) {
     struct {
         Params params;
-        int minWidth, maxWidth, minHeight, maxHeight;
+        int limits[4];  // width from and to, height from and to
     } const rows[] = {
-        {{{"mode", 1}}, 32, 1920, 32, 1080},
-        {{{"cropWidth", 640}, {"moveCropBox", QvPoint(960, 100)}}, 32, 960, 16, 540},
-        {{{"inputWidth", 1080}, {"inputHeight", 1920}}, 16, 1080, 32, 1920},
-        {{{"inputWidth", 20}, {"inputHeight", 20}}, 20, 20, 20, 20},
+        {{{"mode", 1}}, {32, 1920, 32, 1080}},
+        {{{"cropWidth", 640}, {"moveCropBox", QvPoint(960, 100)}}, {32, 960, 16, 540}},
+        {{{"inputWidth", 1080}, {"inputHeight", 1920}}, {16, 1080, 32, 1920}},
+        {{{"inputWidth", 20}, {"inputHeight", 20}}, {20, 20, 20, 20}},
     };
     for (const auto& row : rows) {
         Cropper crop(row.params);
-        EXPECT_EQ(crop.number("minWidth"), row.minWidth) << &row - rows;
-        EXPECT_EQ(crop.number("maxWidth"), row.maxWidth) << &row - rows;
-        EXPECT_EQ(crop.number("minHeight"), row.minHeight) << &row - rows;
-        EXPECT_EQ(crop.number("maxHeight"), row.maxHeight) << &row - rows;
-        for (const auto& [name, wrong] : {std::pair{"cropWidth", row.maxWidth + 4},
-                                          {"cropHeight", row.maxHeight + 4},
-                                          {"cropWidth", row.minWidth - 4},
-                                          {"cropHeight", 0},
-                                          {"cropWidth", INT_MIN}}) {
-            const QvRect before = crop.box();
-            EXPECT_EQ(crop.setParam(name, wrong), -1) << name << wrong;
+        const char* const names[] = {"minWidth", "maxWidth", "minHeight", "maxHeight"};
+        for (int i = 0; i < 4; ++i)
+            EXPECT_EQ(crop.number(names[i]), row.limits[i]) << &row - rows << names[i];
+        const QvRect before = crop.box();
+        for (const int wrong : {row.limits[1] + 4, row.limits[0] - 4, 0, INT_MIN}) {
+            EXPECT_EQ(crop.setParam("cropWidth", wrong), -1) << wrong;
+            EXPECT_EQ(crop.setParam("cropHeight", wrong + (wrong > 0 ? 2000 : 0)), -1) << wrong;
             EXPECT_EQ(crop.box(), before);
         }
     }
@@ -151,42 +147,28 @@ TEST(QvCrop, StatesGoFromOneToAnother) {
 TEST(QvCrop, PicturesOfEveryFormatAreCutAndPadded) {
     for (const auto& format : qvPixelFormats()) {
         if (format.fourcc == QvFourcc::v210) continue;
-        QvFrame in = makePicture(format.fourcc, 64, 48), black;
+        QvFrame in = makePicture(format.fourcc, 64, 48), wanted;
         in.framerate.setInterlaced(1);
         in.setTimestamp(9);
-        Opened crop({{"inputWidth", 64},
-                     {"inputHeight", 48},
-                     {"mode", 1},
-                     {"cropWidth", 36},
-                     {"cropHeight", 32},
-                     {"moveCropBox", QvPoint(8, 4)},
-                     {"padTop", 10},
-                     {"padBottom", 2},
-                     {"padLeft", 4}});
+        wanted.init(format.fourcc, 40, 44);
+        wanted.setBlack();
+        for (int p = 0; p < in.planes(); ++p) {
+            const int across = p ? 2 : 1, down = p && format.chroma == QvChroma::quarter ? 2 : 1;
+            const int bytes = in.pixelBytes(p);
+            for (int y = 0; y < 32 / down; ++y)
+                std::memcpy(wanted.plane(p) + wanted.stride(p) * (y + 10 / down) + 4 / across * bytes,
+                            rowOf(in, p, y + 4 / down) + 8 / across * bytes,
+                            static_cast<size_t>(36 / across * bytes));
+        }
+        Opened crop({{"inputWidth", 64}, {"inputHeight", 48}, {"mode", 1}, {"padTop", 10}, {"padBottom", 2}});
+        crop.setParamDict(AnyDict("cropBox", QvRect(8, 4, 44, 36), "padLeft", 4));
         for (int time = 0; time < 2; ++time) {
             const QvFrame& out = crop.through(in);
             ASSERT_EQ(out.width(), 40);
             ASSERT_EQ(out.height(), 44);
+            EXPECT_TRUE(samplesOf(out) == samplesOf(wanted)) << fourccName(format.fourcc);
             EXPECT_EQ(out.getTimestamp(), 9);
             EXPECT_EQ(out.framerate.interlaced(), 1);
-            black.init(format.fourcc, 40, 44);
-            black.setBlack();
-            for (int p = 0; p < in.planes(); ++p) {
-                const int across = p ? 2 : 1, down = p && format.chroma == QvChroma::quarter ? 2 : 1;
-                const int bytes = in.pixelBytes(p);
-                for (int y = 0; y < planeRows(out, p); ++y) {
-                    const bool bar = y < 10 / down || y >= 42 / down;
-                    const int left = bar ? 40 / across * bytes : 4 / across * bytes;
-                    EXPECT_EQ(std::memcmp(rowOf(out, p, y), rowOf(black, p, y), static_cast<size_t>(left)), 0)
-                        << fourccName(format.fourcc) << p << y;
-                    if (bar) continue;
-                    EXPECT_EQ(
-                        std::memcmp(rowOf(out, p, y) + left, rowOf(in, p, y - 6 / down) + 8 / across * bytes,
-                                    static_cast<size_t>(36 / across * bytes)),
-                        0)
-                        << fourccName(format.fourcc) << p << y;
-                }
-            }
         }
         EXPECT_EQ(crop.setParam("_on", 0), 0);
         EXPECT_EQ(samplesOf(crop.through(in)), samplesOf(in)) << "as it is when off";

@@ -18,7 +18,7 @@ TEST(QvFlipper, TurnsAllRowsOfEveryFormat) {
             Opened flipper;
             const QvFrame& out = flipper.through(in);
             for (int p = 0; p < in.planes(); ++p)
-                for (int y = 0, last = planeRows(in, p) - 1; y <= last; ++y)
+                for (int y = 0, last = sampleRows(in, p) - 1; y <= last; ++y)
                     EXPECT_EQ(std::memcmp(rowOf(out, p, y), rowOf(in, p, last - y),
                                           static_cast<size_t>(in.stride(p))),
                               0)

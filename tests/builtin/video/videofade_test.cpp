@@ -88,7 +88,7 @@ TEST(CVideoFade, EveryFormatFadesToItsBlackAndKeepsAlpha) {
         QvFrame in = makePicture(sample.fourcc, 12, 6);
         Opened fade({{"fade_in", 2}});
         const QvFrame& out = fade.through(in);
-        const int last = planeRows(out, sample.plane) - 1;
+        const int last = sampleRows(out, sample.plane) - 1;
         EXPECT_EQ(rowOf(out, sample.plane, last)[sample.byte], sample.black) << fourccName(sample.fourcc);
     }
     QvFrame in = makePicture(QvFourcc::BGRA, 4, 2);
