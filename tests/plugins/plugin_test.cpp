@@ -1,5 +1,4 @@
 // Plug-in files loaded by the shared library, as an application does it.
-#include <filesystem>
 #include <memory>
 
 #include "core/decode/decodefactory.h"
@@ -12,8 +11,6 @@
 #include "core/filter/qvfilter.h"
 #include "core/media/qvbuffer.h"
 #include "tests/support/checks.h"
-#include "tests/support/log_capture.h"
-#include "tests/support/temp_folder.h"
 
 namespace {
 

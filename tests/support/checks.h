@@ -1,4 +1,5 @@
-// What most tests of the core use: GoogleTest, names of both widths, and the text of a failure.
+// What most tests of the core use: GoogleTest, folders, failing platforms, the log, names of both widths, and
+// the text of a failure.
 #pragma once
 
 #include <gtest/gtest.h>
@@ -10,6 +11,9 @@
 #include "core/arch/widename.h"
 #include "core/engine/qvexception.h"
 #include "core/value/anycontainer.h"
+#include "tests/support/log_capture.h"
+#include "tests/support/platform_scope.h"
+#include "tests/support/temp_folder.h"
 
 using Texts = std::vector<std::string>;
 

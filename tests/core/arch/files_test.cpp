@@ -1,13 +1,8 @@
 #include <fcntl.h>
-#include <gtest/gtest.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include <filesystem>
-
-#include "core/arch/platform.h"
-#include "tests/support/platform_scope.h"
-#include "tests/support/temp_folder.h"
+#include "tests/support/checks.h"
 
 namespace {
 

@@ -1,10 +1,6 @@
 #include <sys/resource.h>
 
-#include <filesystem>
-
-#include "core/arch/platform.h"
 #include "tests/support/checks.h"
-#include "tests/support/temp_folder.h"
 
 namespace {
 

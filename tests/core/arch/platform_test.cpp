@@ -1,15 +1,12 @@
 #include "core/arch/platform.h"
 
-#include <gtest/gtest.h>
 #include <sched.h>
 
 #include <cstdint>
 #include <cstdlib>
-#include <filesystem>
 #include <limits>
 
-#include "tests/support/platform_scope.h"
-#include "tests/support/temp_folder.h"
+#include "tests/support/checks.h"
 
 namespace {
 

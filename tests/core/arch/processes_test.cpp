@@ -1,9 +1,6 @@
 #include <csignal>
-#include <filesystem>
 
-#include "core/arch/platform.h"
 #include "tests/support/checks.h"
-#include "tests/support/temp_folder.h"
 
 namespace {
 

@@ -1,9 +1,8 @@
 #include "core/arch/widename.h"
 
-#include <gtest/gtest.h>
-
 #include <random>
-#include <vector>
+
+#include "tests/support/checks.h"
 
 namespace {
 

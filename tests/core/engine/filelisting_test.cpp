@@ -1,9 +1,5 @@
-#include <filesystem>
-
 #include "core/engine/qvfileutil.h"
 #include "tests/support/checks.h"
-#include "tests/support/log_capture.h"
-#include "tests/support/temp_folder.h"
 
 namespace {
 

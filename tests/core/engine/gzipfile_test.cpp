@@ -2,8 +2,6 @@
 
 #include "core/engine/qvfileutil.h"
 #include "tests/support/checks.h"
-#include "tests/support/platform_scope.h"
-#include "tests/support/temp_folder.h"
 
 namespace {
 

@@ -6,7 +6,6 @@
 #include "core/engine/qvmodule.h"
 #include "core/engine/qvregistry.h"
 #include "tests/support/checks.h"
-#include "tests/support/log_capture.h"
 
 namespace {
 
@@ -183,25 +182,20 @@ TEST(Module, KnowsItsInstances) {
     EXPECT_EQ(module.codecList().size(), 1);
 }
 
-TEST(Module, CopiesOfACodecAreNoInstances) {
-    GainModule module, other;
-    Gain codec(&module), moved(&other);
+TEST(Module, CopiesOfACodecAreNoInstancesAndItMayEndFirst) {
+    auto module = std::make_unique<GainModule>();
+    GainModule other;
+    Gain codec(module.get()), moved(&other);
     codec.setError(-3, "text");
     EXPECT_STREQ(Gain(codec).errorDesc(), "text");
-    EXPECT_EQ(module.codecList().size(), 1);
+    EXPECT_EQ(module->codecList().size(), 1);
     moved = codec;
-    EXPECT_EQ(moved.module(), &module);
+    EXPECT_EQ(moved.module(), module.get());
     EXPECT_EQ(other.codecList().size(), 0);  // it would hold a dangling pointer later
-}
-
-TEST(Module, EndsBeforeItsCodecs) {
-    auto module = std::make_unique<GainModule>();
-    const std::unique_ptr<QvCodec> first(module->create());
-    const std::unique_ptr<QvCodec> second(module->create());
     LogCapture log;
     module.reset();
-    EXPECT_TRUE(log.contains("Gain filter: *** 2 instances still alive", QvLogMask::warning));
-    EXPECT_STREQ(first->name(), "unnamed");
+    EXPECT_EQ(log.count(" instances still alive", QvLogMask::warning), 1);
+    EXPECT_STREQ(codec.name(), "unnamed");
 }
 
 }  // namespace

@@ -2,7 +2,6 @@
 
 #include "core/value/qvassert.h"
 #include "tests/support/checks.h"
-#include "tests/support/log_capture.h"
 
 namespace {
 

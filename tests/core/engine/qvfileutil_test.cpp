@@ -4,13 +4,9 @@
 #include <sys/stat.h>
 
 #include <ctime>
-#include <filesystem>
 
 #include "core/media/datetime.h"
 #include "tests/support/checks.h"
-#include "tests/support/log_capture.h"
-#include "tests/support/platform_scope.h"
-#include "tests/support/temp_folder.h"
 
 namespace {
 

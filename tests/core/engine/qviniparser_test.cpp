@@ -1,8 +1,6 @@
 #include "core/engine/qviniparser.h"
 
 #include "tests/support/checks.h"
-#include "tests/support/log_capture.h"
-#include "tests/support/temp_folder.h"
 
 namespace {
 

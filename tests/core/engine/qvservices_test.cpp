@@ -1,10 +1,9 @@
 // What plug-in code with a plain C interface gets by name.
-#include <gtest/gtest.h>
 
 #include <cstring>
 
 #include "core/engine/qvcodec.h"
-#include "core/engine/qvlog.h"
+#include "tests/support/checks.h"
 
 namespace {
 

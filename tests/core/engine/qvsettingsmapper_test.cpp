@@ -6,7 +6,6 @@
 #include <cstring>
 
 #include "tests/support/checks.h"
-#include "tests/support/log_capture.h"
 
 namespace {
 

@@ -1,15 +1,12 @@
 #include "core/engine/qvthreadpool.h"
 
-#include <gtest/gtest.h>
-
 #include <atomic>
 #include <condition_variable>
 #include <mutex>
 #include <stdexcept>
 #include <thread>
-#include <vector>
 
-#include "tests/support/platform_scope.h"
+#include "tests/support/checks.h"
 
 namespace {
 

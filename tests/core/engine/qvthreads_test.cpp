@@ -1,10 +1,8 @@
 #include "core/engine/qvthreads.h"
 
-#include <gtest/gtest.h>
-
 #include <atomic>
 
-#include "tests/support/platform_scope.h"
+#include "tests/support/checks.h"
 
 namespace {
 

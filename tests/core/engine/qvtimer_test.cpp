@@ -1,12 +1,9 @@
 #include "core/engine/qvtimer.h"
 
-#include <gtest/gtest.h>
-
 #include <cmath>
 #include <limits>
-#include <string>
 
-#include "tests/support/platform_scope.h"
+#include "tests/support/checks.h"
 
 namespace {
 

@@ -1,8 +1,5 @@
 #include "core/media/bitrate.h"
-
-#include <gtest/gtest.h>
-
-#include "core/value/any.h"
+#include "tests/support/checks.h"
 
 namespace {
 

@@ -1,8 +1,5 @@
 #include "core/media/frameque.h"
-
-#include <gtest/gtest.h>
-
-#include "core/engine/qvexception.h"
+#include "tests/support/checks.h"
 
 namespace {
 

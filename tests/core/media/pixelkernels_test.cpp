@@ -1,13 +1,12 @@
 #include "core/media/pixelkernels_p.h"
 
-#include <gtest/gtest.h>
 #include <hwy/targets.h>
 
 #include <cstring>
 #include <random>
 #include <set>
-#include <string>
-#include <vector>
+
+#include "tests/support/checks.h"
 
 namespace {
 

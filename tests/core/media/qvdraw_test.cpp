@@ -28,7 +28,7 @@ Pixels drawn(const QvFrame& frame) {
     for (int y = 0; y < frame.height(); ++y)
         for (int x = 0; x < frame.width(); ++x)
             if (std::any_of(frame.pixelPtr(x, y), frame.pixelPtr(x, y) + frame.pixelBytes(),
-                            [](int b) { return b != 0; }))
+                            [](int b) { return b; }))
                 found.insert({x, y});
     return found;
 }

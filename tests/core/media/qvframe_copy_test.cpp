@@ -5,7 +5,6 @@
 #include "core/media/qvframe.h"
 #include "tests/core/media/frame_model.h"
 #include "tests/support/checks.h"
-#include "tests/support/log_capture.h"
 
 namespace {
 

@@ -1,9 +1,6 @@
-#include <gtest/gtest.h>
-
-#include <string>
-
 #include "core/media/qvframe.h"
 #include "tests/core/media/frame_model.h"
+#include "tests/support/checks.h"
 
 namespace {
 

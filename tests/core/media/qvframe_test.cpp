@@ -8,7 +8,6 @@
 #include "core/value/ptrlist.h"
 #include "tests/core/media/frame_model.h"
 #include "tests/support/checks.h"
-#include "tests/support/log_capture.h"
 
 namespace {
 

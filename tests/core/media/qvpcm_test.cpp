@@ -5,7 +5,6 @@
 
 #include "core/engine/status.h"
 #include "tests/support/checks.h"
-#include "tests/support/log_capture.h"
 
 namespace {
 

@@ -1,11 +1,9 @@
 #include "core/media/timecode.h"
 
-#include <gtest/gtest.h>
-
 #include <climits>
-#include <string>
 
 #include "core/media/qvframerate.h"
+#include "tests/support/checks.h"
 
 namespace {
 

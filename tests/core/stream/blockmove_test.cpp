@@ -1,7 +1,5 @@
 #include "core/stream/qvfilebufstream.h"
 #include "streamtools.h"
-#include "tests/support/platform_scope.h"
-#include "tests/support/temp_folder.h"
 
 namespace {
 

@@ -5,7 +5,6 @@
 
 #include "core/stream/qvfilebufstream.h"
 #include "streamtools.h"
-#include "tests/support/temp_folder.h"
 
 namespace {
 

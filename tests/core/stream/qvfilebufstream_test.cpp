@@ -4,10 +4,7 @@
 
 #include <cerrno>
 
-#include "core/engine/qvlog.h"
 #include "streamtools.h"
-#include "tests/support/platform_scope.h"
-#include "tests/support/temp_folder.h"
 
 namespace {
 

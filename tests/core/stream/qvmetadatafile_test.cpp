@@ -1,8 +1,6 @@
 #include "core/stream/qvmetadatafile.h"
 
 #include "streamtools.h"
-#include "tests/support/log_capture.h"
-#include "tests/support/temp_folder.h"
 
 namespace {
 

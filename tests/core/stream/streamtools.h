@@ -3,9 +3,7 @@
 
 #include <cstdint>
 #include <cstring>
-#include <string>
 #include <string_view>
-#include <vector>
 
 #include "core/stream/bufstream.h"
 #include "core/stream/qvbufstrm.h"

@@ -35,20 +35,15 @@ TEST(Any, typeNumbersAndNames) {
 }
 
 TEST(Any, copiesAndMovesOfEachTypeOverEachType) {
-    const auto values = oneOfEach();
-    for (const Any& from : values) {
-        for (const Any& over : values) {
-            Any copied = over;
+    for (const Any& from : oneOfEach())
+        for (const Any& over : oneOfEach()) {
+            Any copied = over, source = from, moved = over;
             copied = from;
-            EXPECT_EQ(copied, from) << Any::typeName(over.type());
-            Any source = from;
-            Any moved = over;
             moved = std::move(source);
-            EXPECT_EQ(moved, from) << Any::typeName(over.type());
+            EXPECT_TRUE(copied == from && moved == from) << Any::typeName(over.type());
             moved.invalidate();
             EXPECT_EQ(moved, Any());
         }
-    }
 }
 
 TEST(Any, aPartOfAValueMayReplaceTheWhole) {
@@ -197,13 +192,9 @@ TEST(Any, equalityNeedsTypeSizeAndValue) {
 }
 
 TEST(Any, orderGoesByTypeOnlyForLess) {
-    const auto values = oneOfEach();
-    for (const Any& a : values)
-        for (const Any& b : values) {
-            if (a.type() == b.type()) continue;
-            EXPECT_EQ(a < b, a.type() < b.type());
-            EXPECT_FALSE(a > b);
-        }
+    for (const Any& a : oneOfEach())
+        for (const Any& b : oneOfEach())
+            EXPECT_TRUE(a.type() == b.type() || ((a < b) == (a.type() < b.type()) && !(a > b))) << a.type();
     EXPECT_TRUE(Any(-1) < Any(1) && Any(1) > Any(-1) && !(Any(1) < Any(1)));
     EXPECT_TRUE(Any("a") < Any("ab") && Any("z") < Any("\xC3\xA4") && Any("b") > Any("ab"));
     EXPECT_TRUE(Any(u"\u00FF") < Any(u"\u0100") && Any(u"\uFFFF") > Any(u"a"));

@@ -24,7 +24,7 @@ TEST(AnyVector, referencesSurviveAppending) {
 }
 
 TEST(AnyVector, positionsOutsideTheRange) {
-    AnyVector vector(1, 2, 3);
+    AnyVector vector(1, 2, 3), empty;
     for (int outside : {-1, 3, std::numeric_limits<int>::max(), std::numeric_limits<int>::min()}) {
         EXPECT_TRUE(vector.at(outside).isNull()) << outside;
         EXPECT_EQ(failureOf([&] { vector[outside] = 1; }), nullAssignment);
@@ -35,18 +35,13 @@ TEST(AnyVector, positionsOutsideTheRange) {
     }
     vector.insert(4, 3);
     vector.insert(0, 0);
-    vector.set(1, "one");
-    EXPECT_EQ(vector, AnyVector(0, "one", 2, 3, 4));
-
-    AnyVector empty;
     EXPECT_EQ(failureOf([&] { empty.front(); }), "");
     EXPECT_EQ(failureOf([&] { std::as_const(empty).back(); }), "");
-    EXPECT_EQ(empty.popBack(), Any());
-    EXPECT_EQ(vector.popBack(), 4);
+    EXPECT_EQ(failureOf([&] { vector.resize(-1); }), "");
+    EXPECT_TRUE(empty.popBack() == Any() && vector.popBack() == 4);
     vector.resize(2);
     vector.resize(4);
-    EXPECT_EQ(vector, AnyVector(0, "one", Any(), Any()));
-    EXPECT_EQ(failureOf([&] { vector.resize(-1); }), "");
+    EXPECT_EQ(vector, AnyVector(0, 1, Any(), Any()));
 }
 
 TEST(AnyVector, mayBeAddedToItselfAndCopiesAreDeep) {

@@ -4,7 +4,6 @@
 #include <memory>
 
 #include "tests/support/checks.h"
-#include "tests/support/temp_folder.h"
 
 namespace {
 
@@ -161,9 +160,9 @@ TEST(XmlParser, storesWhatItCanReadAgain) {
     root.setAttr("v", "<&>\"'");
     EXPECT_EQ(XmlParser::storeXmlTree(file.c_str(), &root, "r"), 0);
     const std::string bytes = TempFolder::read(file);
-    EXPECT_EQ(bytes,
-              "<?xml version=\"1.0\" encoding=\"UTF-8\" ?>\n<!DOCTYPE r>\n"
-              "<r v=\"&lt;&amp;&gt;&quot;&apos;\"/>\n");
+    EXPECT_EQ(
+        bytes,
+        "<?xml version=\"1.0\" encoding=\"UTF-8\" ?>\n<!DOCTYPE r>\n<r v=\"&lt;&amp;&gt;&quot;&apos;\"/>\n");
     XmlParser parser;
     parser.parseFile(Any(file.c_str()).toWString());
     EXPECT_EQ(parser.topLevel()->getAttr("v"), root.getAttr("v"));

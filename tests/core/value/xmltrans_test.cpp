@@ -7,8 +7,6 @@
 #include "core/media/qvgeometry.h"
 #include "tests/support/checks.h"
 #include "tests/support/comma_locale.h"
-#include "tests/support/log_capture.h"
-#include "tests/support/temp_folder.h"
 
 namespace {
 
