@@ -6,7 +6,7 @@
 
 #include "builtin/kernels/deep.h"
 #include "builtin/kernels/lines.h"
-#include "builtin/kernels/rgbhalves.h"
+#include "builtin/kernels/rgbchroma.h"
 #include "builtin/kernels/rows16.h"
 #include "builtin/kernels/rows8.h"
 
@@ -60,8 +60,8 @@ class Band {
         if (format.planes() == 1 || y % format.down()) return;
         const int chroma = y / format.down();
         if (chroma >= chromaGroup().down.target) return;
-        if (plan_.halves)
-            return chromaOfHalves(chroma, lineOf(target_, 1, chroma), lineOf(target_, 2, chroma));
+        if (plan_.pixels)
+            return chromaOfPixels(chroma, lineOf(target_, 1, chroma), lineOf(target_, 2, chroma));
         planeInto(1, chroma);
         planeInto(2, chroma);
     }
@@ -175,9 +175,11 @@ class Band {
     const Byte* pixelsOf(int y) {
         const Format& format = *source_.format;
         const Byte* line = lineOf(source_, 0, y);
-        const int width = source_.width;
         if (format.packing == Packing::bytes4) return line;
-        Byte* const pixels = lines_.pixels.get();
+        bool fresh;
+        Byte* const pixels = lines_.pixels.at(y, fresh);
+        if (!fresh) return pixels;
+        const int width = source_.width;
         if (format.packing == Packing::bytes3) {
             pack3to4(pixels, line, count(width));
         } else {
@@ -188,40 +190,20 @@ class Band {
         return pixels;
     }
 
-    // Where luma of source line y goes; null: nowhere.
-    Byte* lumaPlace(int y, bool& fresh) {
-        Byte* const own = reinterpret_cast<Byte*>(sourcePlace(0, y, fresh));
-        return target_.format->planar() ? targetLuma(y) : own;
+    void lumaOfPixels(int y, Byte* to) {
+        rgb4ToLuma(yuvRows(), pixelsOf(y + scaling(0).luma.down.offset), to, count(source_.width));
     }
 
-    const Byte* lumaOfPixels(int y) {
-        bool fresh;
-        Byte* const place = lumaPlace(y, fresh);
-        if (fresh) rgb4ToLuma(yuvRows(), pixelsOf(y), place, count(source_.width));
-        return place;
-    }
-
-    const int16_t* halvesOf(int y) {
-        bool fresh;
-        int16_t* const halves = lines_.halves.at(y, fresh);
-        if (!fresh) return halves;
-        const Byte* pixels = pixelsOf(y);
-        const bool filtered = chromaGroup().spread != Group::everySecond;
-        rgb4Halves(pixels, halves, count(source_.width), filtered);
-        Byte* const luma = lumaPlace(y, fresh);
-        if (fresh && luma) rgb4ToLuma(yuvRows(), pixels, luma, count(source_.width));
-        return halves;
-    }
-
-    void chromaOfHalves(int y, Byte* u, Byte* v) {
+    void chromaOfPixels(int y, Byte* u, Byte* v) {
         const Group& group = chromaGroup();
         const Axis& down = group.down;
-        const int16_t* lines[maxTaps];
         const int start = down.copies ? y + down.offset : down.start[count(y)];
-        for (int t = 0; t < down.taps; ++t) lines[t] = halvesOf(std::clamp(start + t, 0, down.source - 1));
-        const int* weights = group.halvesDown.data();
-        if (down.taps > 1) weights += count(y) * count(down.taps);
-        halvesToChroma(yuvRows(), lines, weights, down.taps, u, v, count(group.across.target));
+        const Byte* lines[4];
+        for (int t = 0; t < 4; ++t)
+            lines[t] = pixelsOf(std::clamp(start + std::min(t, down.taps - 1), 0, down.source - 1));
+        const Byte* weights = group.pixelsDown.data() + (down.taps > 1 ? 4 * count(y) : 0);
+        const bool filtered = group.spread != Group::everySecond;
+        rgb4ToChroma(yuvRows(), lines, weights, filtered, u, v, count(source_.width));
     }
 
     // --- Scaling.
@@ -390,7 +372,7 @@ class Band {
         const int width = plane ? plan_.request.width / format.across() : plan_.request.width;
         Byte* line = lineOf(target_, plane, y);
         if constexpr (!deep) {
-            if (plan_.halves) return static_cast<void>(lumaOfPixels(y + scaling(0).luma.down.offset));
+            if (plan_.pixels) return lumaOfPixels(y, line);
             finalInto(plane, y, line, width);
         } else {
             const bool inPlace = format.packing == Packing::planar16 && target_.depth == 16 &&
@@ -409,8 +391,8 @@ class Band {
         Byte* line = lineOf(target_, 0, y);
         if (!deep && plan_.yuvToRgb && packFused(y, line)) return;
         S* planes[4] = {};
-        if (!deep && plan_.halves)
-            halvesTarget(y, planes);
+        if (!deep && plan_.pixels)
+            pixelsTarget(y, planes);
         else
             for (int p = 0; p < (plan_.alpha ? 4 : 3); ++p) planes[p] = const_cast<S*>(finalLine(p, y));
         if constexpr (!deep) {
@@ -429,12 +411,12 @@ class Band {
         }
     }
 
-    void halvesTarget(int y, S* planes[4]) {
+    void pixelsTarget(int y, S* planes[4]) {
         if constexpr (!deep) {
             bool ignored;
-            for (int p = 1; p < 3; ++p) planes[p] = lines_.stages[0].out[p].at(y, ignored);
-            chromaOfHalves(y, planes[1], planes[2]);
-            planes[0] = const_cast<Byte*>(lumaOfPixels(y + scaling(0).luma.down.offset));
+            for (int p = 0; p < 3; ++p) planes[p] = lines_.stages[0].out[p].at(y, ignored);
+            lumaOfPixels(y, planes[0]);
+            chromaOfPixels(y, planes[1], planes[2]);
         }
     }
 

@@ -30,8 +30,7 @@ struct Lines {
     Block<Byte> narrow;  // four lines of bytes beside 16-bit ones
     size_t narrowLength = 0;
     Block<S> neutral;
-    Ring<int16_t> halves;  // four words for each two pixels
-    Block<Byte> pixels;    // a line of other RGB as four bytes a pixel
+    Ring<Byte> pixels;  // lines of other RGB as four bytes a pixel
 
     explicit Lines(const Plan& plan);
     void forget();

@@ -3,7 +3,7 @@
 #include <algorithm>
 #include <cmath>
 
-#include "builtin/kernels/rgbhalves.h"
+#include "builtin/kernels/rgbchroma.h"
 #include "builtin/kernels/workspace.h"
 
 namespace srk {
@@ -118,13 +118,15 @@ struct Maker {
     }
 };
 
-// Weights of the pass down with a sum of halvesUnity for each line; empty: they are no whole numbers then.
-std::vector<int> halvesWeights(const Axis& down) {
-    if (down.copies || down.taps == 1) return {halvesUnity};
-    std::vector<int> weights;
+// Weights of the pass down as rgb4ToChroma takes them; empty: they do not fit.
+std::vector<Byte> pixelWeights(const Axis& down) {
+    if (down.copies || down.taps == 1) return {chromaUnity, 0, 0, 0};
+    if (down.taps != 4) return {};
+    std::vector<Byte> weights;
+    weights.reserve(down.weights.size());
     for (const int weight : down.weights) {
-        if (weight % (unity / halvesUnity) != 0 || weight < 0) return {};
-        weights.push_back(weight / (unity / halvesUnity));
+        if (weight % (unity / chromaUnity) != 0 || weight < 0) return {};
+        weights.push_back(static_cast<Byte>(weight / (unity / chromaUnity)));
     }
     return weights;
 }
@@ -136,7 +138,7 @@ bool readsPixels(const Format& format) {
 }
 
 // Chroma may be filtered before the matrix: every second pixel, alone or with a quarter of its neighbours.
-void setHalves(Plan& plan) {
+void setPixels(Plan& plan) {
     const Request& request = plan.request;
     if (plan.deep || !plan.rgbToYuv || !readsPixels(*plan.source) || plan.target->across() != 2) return;
     if (request.across != Mapping{} || request.width != request.sourceWidth) return;
@@ -144,10 +146,10 @@ void setHalves(Plan& plan) {
         Group& chroma = plan.scaling[f].chroma;
         if (chroma.empty() || chroma.across.target == 0 || !plan.scaling[f].luma.copies()) return;
         if (chroma.bytesAcross.form != Across::halves && chroma.spread != Group::everySecond) return;
-        chroma.halvesDown = halvesWeights(chroma.down);
-        if (chroma.halvesDown.empty()) return;
+        chroma.pixelsDown = pixelWeights(chroma.down);
+        if (chroma.pixelsDown.empty()) return;
     }
-    plan.halves = true;
+    plan.pixels = true;
 }
 
 int widest(const Plan& plan) { return std::max(plan.request.sourceWidth, plan.request.width); }
@@ -219,7 +221,7 @@ std::shared_ptr<const Plan> makePlan(const Request& request) {
         if (plan->again)
             plan->second[f] = maker.scaling({}, {}, nullptr, plan->target, request.width, request.height, f);
     }
-    setHalves(*plan);
+    setPixels(*plan);
     return plan;
 }
 

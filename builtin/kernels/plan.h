@@ -36,7 +36,7 @@ struct Group {
     // pixel is repeated, interpolated or picked out behind the pass down.
     enum Spread : uint8_t { none, asIs, repeated, doubled, everySecond } spread = none;
     std::vector<int8_t> bytesDown;  // of the pass down, for each line
-    std::vector<int> halvesDown;    // the same for halvesToChroma
+    std::vector<Byte> pixelsDown;   // the same for rgb4ToChroma: four for each line, or four for all
     bool copies() const { return across.copies && down.copies; }
     bool empty() const { return across.source == 0 || down.source == 0; }  // nothing to scale from
 };
@@ -60,7 +60,7 @@ struct Plan {
     bool floatRgb = false;     // one side is RGB in floats, which has a matrix of its own
     bool alpha = false;        // both sides have it
     bool again = false;        // chroma is brought to its size behind the matrix
-    bool halves = false;       // RGB of unchanged size to chroma of every second pixel
+    bool pixels = false;       // RGB of unchanged size to chroma of every second pixel
     int fields = 1;
     Scaling scaling[2];  // for each field
     Scaling second[2];   // if `again`

@@ -39,16 +39,14 @@ Lines<S>::Lines(const Plan& plan) {
     narrow.grow(planes * narrowLength);
     neutral.grow(static_cast<size_t>(width));
     std::fill_n(neutral.get(), width, neutralSample<S>);
-    if (!plan.halves) return;
-    halves.set(slots, 2 * width);
-    pixels.grow(4 * static_cast<size_t>(width));
+    if (plan.pixels && plan.source->packing != Packing::bytes4) pixels.set(slots, 4 * width);
 }
 
 template <class S>
 void Lines<S>::forget() {
     for (auto& ring : source) ring.forget();
     for (auto& ring : matrixed) ring.forget();
-    halves.forget();
+    pixels.forget();
     for (auto& stage : stages)
         for (int p = 0; p < planes; ++p) {
             stage.words[p].forget();

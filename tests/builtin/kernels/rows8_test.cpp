@@ -5,7 +5,7 @@
 
 #include <cmath>
 
-#include "builtin/kernels/rgbhalves.h"
+#include "builtin/kernels/rgbchroma.h"
 #include "tests/builtin/kernels/units.h"
 
 using namespace srk;
@@ -14,17 +14,9 @@ namespace {
 
 constexpr Matrix b601 = Matrix::bt601, b709 = Matrix::bt709;
 
-constexpr LineSize chromaWords{8, 1, 2};
-
-void chromaOf(const LineCase& l, std::initializer_list<int> weights) {
-    const int16_t* lines[4];
-    for (int t = 0; t < 4; ++t) {
-        uint16_t* const words = l.words(t);
-        for (size_t i = 0; i < 4 * l.n; ++i) words[i] %= 1021;  // sums of four bytes
-        lines[t] = reinterpret_cast<const int16_t*>(words);
-    }
-    halvesToChroma(toYuv(b601, false), lines, weights.begin(), static_cast<int>(weights.size()), l.out[0],
-                   l.out[1], l.n);
+void chromaOf(const LineCase& l, const Byte (&weights)[4], bool filtered) {
+    const Byte* const lines[4] = {l.in[0], l.in[1], l.in[2], l.in[3]};
+    rgb4ToChroma(toYuv(b601, false), lines, weights, filtered, l.out[0], l.out[1], l.n);
 }
 
 const LineKernel kernels[] = {
@@ -148,30 +140,30 @@ const LineKernel kernels[] = {
      {four},
      {one},
      [](const LineCase& l) { rgb4ToLuma(toYuv(b709, false), l.in[0], l.out[0], l.n); }},
-    {"rgb4Halves",
-     {four},
-     {{8, 2, 2}},
-     [](const LineCase& l) { rgb4Halves(l.in[0], reinterpret_cast<int16_t*>(l.out[0]), l.n, true); }},
-    {"rgb4Halves of single pixels",
-     {four},
-     {{8, 2, 2}},
-     [](const LineCase& l) { rgb4Halves(l.in[0], reinterpret_cast<int16_t*>(l.out[0]), l.n, false); }},
-    {"halvesToChroma, symmetric",
-     {chromaWords, chromaWords, chromaWords, chromaWords},
-     {one, one},
+    {"rgb4ToChroma",
+     {four, four, four, four},
+     {half, half},
      [](const LineCase& l) {
-         chromaOf(l, {2, 6, 6, 2});
+         chromaOf(l, {2, 6, 6, 2}, true);
      }},
-    {"halvesToChroma",
-     {chromaWords, chromaWords, chromaWords, chromaWords},
-     {one, one},
+    {"rgb4ToChroma of a line",
+     {four, four, four, four},
+     {half, half},
      [](const LineCase& l) {
-         chromaOf(l, {1, 5, 7, 3});
+         chromaOf(l, {chromaUnity, 0, 0, 0}, true);
      }},
-    {"halvesToChroma of a line",
-     {chromaWords, chromaWords, chromaWords, chromaWords},
-     {one, one},
-     [](const LineCase& l) { chromaOf(l, {halvesUnity}); }},
+    {"rgb4ToChroma of single pixels",
+     {four, four, four, four},
+     {half, half},
+     [](const LineCase& l) {
+         chromaOf(l, {1, 5, 7, 3}, false);
+     }},
+    {"rgb4ToChroma of a line's single pixels",
+     {four, four, four, four},
+     {half, half},
+     [](const LineCase& l) {
+         chromaOf(l, {chromaUnity, 0, 0, 0}, false);
+     }},
 };
 
 }  // namespace
@@ -182,7 +174,7 @@ TEST(Rows8, UnitsOfTheMachineReallyRun) {
     for (const auto target : machineTargets()) {
         const OnTarget only(target);
         EXPECT_STREQ(rows8Unit(), hwy::TargetName(target));
-        EXPECT_STREQ(rgbHalvesUnit(), hwy::TargetName(target));
+        EXPECT_STREQ(rgbChromaUnit(), hwy::TargetName(target));
     }
 }
 

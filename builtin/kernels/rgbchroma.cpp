@@ -1,24 +1,24 @@
-#include "builtin/kernels/rgbhalves.h"
+#include "builtin/kernels/rgbchroma.h"
 
 #include <algorithm>
 
 #define HWY_DISABLED_TARGETS (HWY_SSSE3 | HWY_AVX3_DL)
 #undef HWY_TARGET_INCLUDE
-#define HWY_TARGET_INCLUDE "builtin/kernels/rgbhalves.cpp"
+#define HWY_TARGET_INCLUDE "builtin/kernels/rgbchroma.cpp"
 #include <hwy/foreach_target.h>
 #include <hwy/highway.h>
 
 #include "builtin/kernels/vectors-inl.h"
 
 // Elsewhere the plain loops do the work: these count on how this unit packs and multiplies.
-#undef QV_HALVES
-#define QV_HALVES (QV_VECTORS && HWY_ARCH_X86)
+#undef QV_CHROMA
+#define QV_CHROMA (QV_VECTORS && HWY_ARCH_X86)
 
 HWY_BEFORE_NAMESPACE();
 namespace srk {
 namespace HWY_NAMESPACE {
 
-#if QV_HALVES
+#if QV_CHROMA
 // Whole vectors: there is enough to do for each byte.
 const hn::ScalableTag<uint8_t> hBytes;
 using HB = decltype(hn::ScalableTag<uint8_t>());
@@ -92,7 +92,7 @@ HWY_INLINE Byte toByte(int value) { return static_cast<Byte>(std::clamp(value, 0
 
 void rgb4ToLuma(const ToYuv& rows, const Byte* from, Byte* y, size_t n) {
     size_t i = 0;
-#if QV_HALVES
+#if QV_CHROMA
     const auto blueRed = pairWeights(rows.y[0], rows.y[2]), green = pairWeights(rows.y[1], 0);
     const auto add = hn::Set(hInts, rows.yAdd);
     const auto low = hn::Set(hWords, 255);
@@ -115,109 +115,125 @@ void rgb4ToLuma(const ToYuv& rows, const Byte* from, Byte* y, size_t n) {
     }
 }
 
-void rgb4Halves(const Byte* from, int16_t* half, size_t n, bool filtered) {
-    const size_t samples = n / 2;
-    const auto one = [&](size_t i) {
-        const Byte* at = from + 8 * i;
-        const Byte* before = filtered && i > 0 ? at - 4 : at;
-        const Byte* behind = filtered ? at + 4 : at;
-        for (int c = 0; c < 4; ++c)
-            half[4 * i + static_cast<size_t>(c)] = static_cast<int16_t>(before[c] + 2 * at[c] + behind[c]);
-    };
-    size_t i = 0;
-    if (samples > 0) one(i++);
-#if QV_HALVES
-    alignas(16) static constexpr Byte pairs[16] = {0, 4, 1, 5, 2, 6, 3, 7, 8, 12, 9, 13, 10, 14, 11, 15};
-    const auto order = hn::LoadDup128(hBytes, pairs);
-    const size_t step = byteLanes() / 8;
-    const auto weights = hn::BitCast(hBytes, hn::Set(hWords, filtered ? 1 | 1 << 8 : 4));
-    for (; i + step <= samples; i += step) {
-        const auto at = hn::TableLookupBytes(hn::LoadU(hBytes, from + 8 * i), order);
-        auto sum = dotBytes(at, weights);
-        if (filtered) {
-            const auto before = hn::TableLookupBytes(hn::LoadU(hBytes, from + 8 * i - 4), order);
-            sum = hn::Add(sum, dotBytes(before, weights));
-        }
-        hn::StoreU(sum, hWords, half + 4 * i);
-    }
-#endif
-    for (; i < samples; ++i) one(i);
-}
-
-// Of the words: 4 for the pass across, 16 for the one down.
+// Of the sums: 16 for the lines, 4 for the pixels.
 constexpr int chromaShift = 15 + 6;
 
-#if QV_HALVES
-// Sums down: at most 16320.
-HWY_INLINE HV16 weighed(const int16_t* const* lines, const HV16* weights, int taps, size_t at) {
-    auto sum = hn::Mul(hn::LoadU(hWords, lines[0] + at), weights[0]);
-    for (int t = 1; t < taps; ++t) sum = hn::Add(sum, hn::Mul(hn::LoadU(hWords, lines[t] + at), weights[t]));
-    return sum;
+struct ChromaLines {
+    const Byte* line[4];
+    Byte weight[4];
+    // The weighted sum of a byte of all lines.
+    HWY_INLINE int down(size_t at) const {
+        return line[0][at] * weight[0] + line[1][at] * weight[1] + line[2][at] * weight[2] +
+               line[3][at] * weight[3];
+    }
+};
+
+#if QV_CHROMA
+const hn::RepartitionToWide<decltype(hn::Repartition<int32_t, HB>())> hLongs;
+
+// The upper 64 bits of `before` and all but those of `now`.
+HWY_INLINE HV16 carryPixel(HV16 now, HV16 before) {
+#if HWY_TARGET <= HWY_AVX3
+    return HV16{_mm512_alignr_epi64(now.raw, before.raw, 7)};
+#elif HWY_TARGET <= HWY_AVX2
+    return HV16{_mm256_alignr_epi8(now.raw, _mm256_permute2x128_si256(before.raw, now.raw, 0x21), 8)};
+#else
+    return HV16{_mm_alignr_epi8(now.raw, before.raw, 8)};
+#endif
 }
 
-HWY_INLINE HV16 symmetric(const int16_t* const* lines, const HV16* weights, size_t at) {
-    const auto outer = hn::Add(hn::LoadU(hWords, lines[0] + at), hn::LoadU(hWords, lines[3] + at));
-    const auto inner = hn::Add(hn::LoadU(hWords, lines[1] + at), hn::LoadU(hWords, lines[2] + at));
-    return hn::Add(hn::Mul(outer, weights[0]), hn::Mul(inner, weights[1]));
+HWY_INLINE HV16 evenPixels(HV16 low, HV16 high) {
+    return hn::BitCast(hWords,
+                       hn::InterleaveLower(hLongs, hn::BitCast(hLongs, low), hn::BitCast(hLongs, high)));
+}
+HWY_INLINE HV16 oddPixels(HV16 low, HV16 high) {
+    return hn::BitCast(hWords,
+                       hn::InterleaveUpper(hLongs, hn::BitCast(hLongs, low), hn::BitCast(hLongs, high)));
 }
 
-constexpr int mostTaps = 4;
-
-template <class Sum>
-HWY_INLINE size_t eachChroma(const ToYuv& rows, Byte* u, Byte* v, size_t n, const Sum& sumAt) {
-    const auto blueGreenU = pairWeights(rows.u[0], rows.u[1]), blueGreenV = pairWeights(rows.v[0], rows.v[1]);
-    const auto redU = pairWeights(rows.u[2], 0), redV = pairWeights(rows.v[2], 0);
-    const auto rowU =
-        hn::BitCast(hWords, hn::OddEven(hn::BitCast(hInts, redU), hn::BitCast(hInts, blueGreenU)));
-    const auto rowV =
-        hn::BitCast(hWords, hn::OddEven(hn::BitCast(hInts, redV), hn::BitCast(hInts, blueGreenV)));
+template <bool filtered, int lines>
+size_t eachChroma(const ToYuv& rows, const ChromaLines& from, Byte* u, Byte* v, size_t n) {
+    const auto rowOf = [](const int16_t m[3]) HWY_ATTR {
+        return hn::BitCast(hWords, hn::OddEven(hn::BitCast(hInts, pairWeights(m[2], 0)),
+                                               hn::BitCast(hInts, pairWeights(m[0], m[1]))));
+    };
+    const auto rowU = rowOf(rows.u), rowV = rowOf(rows.v);
     const auto add = hn::Set(hInts, rows.chromaAdd << 6);
-    const auto low = hn::Set(huWords, 255);
+    const auto lowByte = hn::Set(huWords, 255);
+    const auto pairOfLines = [&](int t) HWY_ATTR {
+        return hn::BitCast(hBytes,
+                           hn::Set(hWords, static_cast<int16_t>(from.weight[t] | from.weight[t + 1] << 8)));
+    };
+    const auto first = pairOfLines(0), second = pairOfLines(2);
     const hn::Rebind<uint8_t, decltype(hn::Repartition<int16_t, HB>())> narrow;
     const Packer pack;
+    int64_t edge = 0;
+    for (size_t c = 0; c < 4; ++c) edge |= static_cast<int64_t>(from.down(c)) << 16 * c;
+    auto before = hn::BitCast(hWords, hn::Set(hLongs, edge));
     size_t i = 0;
+    // A vector of pixels gives a quarter of one of each chroma; four of them are packed together.
     for (; i + byteLanes() / 2 <= n; i += byteLanes() / 2) {
         HV32 both[4];
         for (size_t k = 0; k < 4; ++k) {
-            const auto sum = sumAt(4 * i + k * byteLanes() / 2);
+            const size_t at = 8 * i + k * byteLanes();
+            const auto a = hn::LoadU(hBytes, from.line[0] + at), b = hn::LoadU(hBytes, from.line[1] + at);
+            auto low = dotBytes(hn::InterleaveLower(hBytes, a, b), first);
+            auto high = dotBytes(hn::InterleaveUpper(hBytes, a, b), first);
+            if (lines > 2) {
+                const auto c = hn::LoadU(hBytes, from.line[2] + at), d = hn::LoadU(hBytes, from.line[3] + at);
+                low = hn::Add(low, dotBytes(hn::InterleaveLower(hBytes, c, d), second));
+                high = hn::Add(high, dotBytes(hn::InterleaveUpper(hBytes, c, d), second));
+            }
+            const auto even = evenPixels(low, high);
+            auto sum = hn::ShiftLeft < filtered ? 1 : 2 > (even);
+            if (filtered) {
+                const auto odd = oddPixels(low, high);
+                sum = hn::Add(hn::Add(sum, odd), carryPixel(odd, before));
+                before = odd;
+            }
             const auto su = dot(sum, rowU), sv = dot(sum, rowV);
             // Blue and green of U beside red of V, and the other way round: added up, U beside V.
             const auto added = hn::Add(hn::OddEven(sv, su), hn::Shuffle2301(hn::OddEven(su, sv)));
             both[k] = hn::ShiftRight<chromaShift>(hn::Add(added, add));
         }
         const auto pairs = hn::BitCast(huWords, pack(both));
-        hn::StoreU(hn::DemoteTo(narrow, hn::BitCast(hWords, hn::And(pairs, low))), narrow, u + i);
+        hn::StoreU(hn::DemoteTo(narrow, hn::BitCast(hWords, hn::And(pairs, lowByte))), narrow, u + i);
         hn::StoreU(hn::DemoteTo(narrow, hn::BitCast(hWords, hn::ShiftRight<8>(pairs))), narrow, v + i);
     }
     return i;
 }
 #endif
 
-void halvesToChroma(const ToYuv& rows, const int16_t* const* lines, const int* weights, int taps, Byte* u,
-                    Byte* v, size_t n) {
+void rgb4ToChroma(const ToYuv& rows, const Byte* const lines[4], const Byte weights[4], bool filtered,
+                  Byte* u, Byte* v, size_t n) {
+    ChromaLines from;
+    std::copy_n(lines, 4, from.line);
+    std::copy_n(weights, 4, from.weight);
+    const size_t samples = n / 2;
     size_t i = 0;
-#if QV_HALVES
-    if (taps <= mostTaps) {
-        HV16 factors[mostTaps];
-        for (int t = 0; t < taps; ++t) factors[t] = hn::Set(hWords, static_cast<int16_t>(weights[t]));
-        if (taps == 4 && weights[0] == weights[3] && weights[1] == weights[2])
-            i = eachChroma(rows, u, v, n, [&](size_t at) HWY_ATTR { return symmetric(lines, factors, at); });
-        else
-            i = eachChroma(rows, u, v, n,
-                           [&](size_t at) HWY_ATTR { return weighed(lines, factors, taps, at); });
-    }
+#if QV_CHROMA
+    const bool two = weights[2] == 0 && weights[3] == 0;
+    if (filtered)
+        i = two ? eachChroma<true, 2>(rows, from, u, v, samples)
+                : eachChroma<true, 4>(rows, from, u, v, samples);
+    else
+        i = two ? eachChroma<false, 2>(rows, from, u, v, samples)
+                : eachChroma<false, 4>(rows, from, u, v, samples);
 #endif
-    for (; i < n; ++i) {
-        int bgr[3] = {};
-        for (int t = 0; t < taps; ++t)
-            for (size_t c = 0; c < 3; ++c) bgr[c] += lines[t][4 * i + c] * weights[t];
+    for (; i < samples; ++i) {
+        int bgr[3];
+        for (size_t c = 0; c < 3; ++c) {
+            const size_t at = 8 * i + c;
+            bgr[c] = filtered ? from.down(i ? at - 4 : at) + 2 * from.down(at) + from.down(at + 4)
+                              : 4 * from.down(at);
+        }
         const int add = rows.chromaAdd << 6;
         u[i] = toByte((rows.u[0] * bgr[0] + rows.u[1] * bgr[1] + rows.u[2] * bgr[2] + add) >> chromaShift);
         v[i] = toByte((rows.v[0] * bgr[0] + rows.v[1] * bgr[1] + rows.v[2] * bgr[2] + add) >> chromaShift);
     }
 }
 
-const char* rgbHalvesUnit() { return hwy::TargetName(HWY_TARGET); }
+const char* rgbChromaUnit() { return hwy::TargetName(HWY_TARGET); }
 
 }  // namespace HWY_NAMESPACE
 }  // namespace srk
@@ -227,21 +243,17 @@ HWY_AFTER_NAMESPACE();
 namespace srk {
 
 HWY_EXPORT(rgb4ToLuma);
-HWY_EXPORT(rgb4Halves);
-HWY_EXPORT(halvesToChroma);
-HWY_EXPORT(rgbHalvesUnit);
+HWY_EXPORT(rgb4ToChroma);
+HWY_EXPORT(rgbChromaUnit);
 
 void rgb4ToLuma(const ToYuv& rows, const Byte* from, Byte* y, size_t n) {
     HWY_DYNAMIC_DISPATCH(rgb4ToLuma)(rows, from, y, n);
 }
-void rgb4Halves(const Byte* from, int16_t* half, size_t n, bool filtered) {
-    HWY_DYNAMIC_DISPATCH(rgb4Halves)(from, half, n, filtered);
+void rgb4ToChroma(const ToYuv& rows, const Byte* const lines[4], const Byte weights[4], bool filtered,
+                  Byte* u, Byte* v, size_t n) {
+    HWY_DYNAMIC_DISPATCH(rgb4ToChroma)(rows, lines, weights, filtered, u, v, n);
 }
-void halvesToChroma(const ToYuv& rows, const int16_t* const* lines, const int* weights, int taps, Byte* u,
-                    Byte* v, size_t n) {
-    HWY_DYNAMIC_DISPATCH(halvesToChroma)(rows, lines, weights, taps, u, v, n);
-}
-const char* rgbHalvesUnit() { return HWY_DYNAMIC_DISPATCH(rgbHalvesUnit)(); }
+const char* rgbChromaUnit() { return HWY_DYNAMIC_DISPATCH(rgbChromaUnit)(); }
 
 }  // namespace srk
 #endif
