@@ -16,8 +16,8 @@ struct ToYuv {
 };
 const ToYuv& toYuv(Matrix matrix, bool videoLevels);
 
-// 8-bit YUV to RGB in 1/16384. Each product is rounded to 1/32, their sum to the nearest; the result lies
-// within 0.55 of the exact one.
+// 8-bit YUV to RGB in 1/16384. Each product is cut to 1/64, that of Cb to B to 1/32, their sum is rounded to
+// the nearest; the result lies within 0.56 of the exact one.
 struct ToRgb {
     int16_t yOffset, y, cbToB, cbToG, crToG, crToR;  // cbToB is half of the coefficient
 };

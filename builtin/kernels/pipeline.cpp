@@ -9,6 +9,7 @@
 #include "builtin/kernels/rgbchroma.h"
 #include "builtin/kernels/rows16.h"
 #include "builtin/kernels/rows8.h"
+#include "builtin/kernels/yuvrgb.h"
 
 namespace srk {
 
@@ -420,15 +421,21 @@ class Band {
         }
     }
 
+    // Chroma of every second pixel at the target's line, where the nearest is taken: a line of the source.
+    const S* shortChroma(int plane, int y) {
+        return downSamples(0, plane, y, lines_.padded.get(), chromaGroup().across.source);
+    }
+
     bool packFused(int y, Byte* line) {
         if constexpr (!deep) {
             const auto packing = target_.format->packing;
             if (packing != Packing::bytes4 && packing != Packing::bytes3) return false;
-            const Byte* from[3];
-            for (int p = 0; p < 3; ++p) from[p] = scaledLine(0, p, y);
+            const bool repeated = chromaGroup().spread == Group::repeated;
+            const Byte* from[3] = {scaledLine(0, 0, y)};
+            for (int p = 1; p < 3; ++p) from[p] = repeated ? shortChroma(p, y) : scaledLine(0, p, y);
             const size_t width = count(plan_.request.width);
             (packing == Packing::bytes4 ? yuvToRgb4 : yuvToRgb3)(rgbRows(), from[0], from[1], from[2], line,
-                                                                 width);
+                                                                 width, repeated);
             return true;
         }
         return false;

@@ -10,89 +10,15 @@
 
 #include "builtin/kernels/vectors-inl.h"
 
-// Elsewhere the plain loops do the work: these count on how this unit packs and multiplies.
-#undef QV_CHROMA
-#define QV_CHROMA (QV_VECTORS && HWY_ARCH_X86)
-
 HWY_BEFORE_NAMESPACE();
 namespace srk {
 namespace HWY_NAMESPACE {
-
-#if QV_CHROMA
-// Whole vectors: there is enough to do for each byte.
-const hn::ScalableTag<uint8_t> hBytes;
-using HB = decltype(hn::ScalableTag<uint8_t>());
-const hn::RepartitionToWide<HB> huWords;
-const hn::Repartition<int16_t, HB> hWords;
-const hn::Repartition<int32_t, HB> hInts;
-using HV8 = hn::Vec<HB>;
-using HV16 = hn::Vec<decltype(hn::Repartition<int16_t, HB>())>;
-using HV32 = hn::Vec<decltype(hn::Repartition<int32_t, HB>())>;
-
-HWY_INLINE size_t byteLanes() { return hn::Lanes(hBytes); }
-
-HWY_INLINE HV32 dot(HV16 a, HV16 b) {
-    auto unused = hn::Zero(hInts);
-    return hn::ReorderWidenMulAccumulate(hInts, a, b, hn::Zero(hInts), unused);
-}
-
-HWY_INLINE HV16 dotBytes(HV8 pixels, HV8 weights) {
-#if HWY_TARGET <= HWY_AVX3
-    return HV16{_mm512_maddubs_epi16(pixels.raw, weights.raw)};
-#elif HWY_TARGET <= HWY_AVX2
-    return HV16{_mm256_maddubs_epi16(pixels.raw, weights.raw)};
-#else
-    return HV16{_mm_maddubs_epi16(pixels.raw, weights.raw)};
-#endif
-}
-
-HWY_INLINE HV8 clampBytes(HV16 low, HV16 high) {
-#if HWY_TARGET <= HWY_AVX3
-    return HV8{_mm512_packus_epi16(low.raw, high.raw)};
-#elif HWY_TARGET <= HWY_AVX2
-    return HV8{_mm256_packus_epi16(low.raw, high.raw)};
-#else
-    return HV8{_mm_packus_epi16(low.raw, high.raw)};
-#endif
-}
-
-HWY_INLINE HV16 pairWeights(int first, int second) {
-    const auto packed = static_cast<uint32_t>(static_cast<uint16_t>(first)) | static_cast<uint32_t>(second)
-                                                                                  << 16;
-    return hn::BitCast(hWords, hn::Set(hInts, static_cast<int32_t>(packed)));
-}
-
-// Four vectors of 32-bit lanes to bytes in their order: packing goes block by block, so double word d of the
-// result lies in block d % blocks at place d / blocks.
-class Packer {
-  public:
-    Packer() : order_(hn::SetTableIndices(hInts, places())) {}
-    HWY_INLINE HV8 operator()(const HV32 v[4]) const {
-        const auto bytes =
-            clampBytes(hn::ReorderDemote2To(hWords, v[0], v[1]), hn::ReorderDemote2To(hWords, v[2], v[3]));
-        return hn::BitCast(hBytes, hn::TableLookupLanes(hn::BitCast(hInts, bytes), order_));
-    }
-
-  private:
-    static const int32_t* places() {
-        static const struct Table {
-            int32_t at[16];
-            Table() {
-                const auto blocks = static_cast<int>(byteLanes() / 16);
-                for (int d = 0; d < 4 * blocks; ++d) at[d] = d % blocks * 4 + d / blocks;
-            }
-        } table;
-        return table.at;
-    }
-    decltype(hn::SetTableIndices(hInts, static_cast<const int32_t*>(nullptr))) order_;
-};
-#endif
 
 HWY_INLINE Byte toByte(int value) { return static_cast<Byte>(std::clamp(value, 0, 255)); }
 
 void rgb4ToLuma(const ToYuv& rows, const Byte* from, Byte* y, size_t n) {
     size_t i = 0;
-#if QV_CHROMA
+#if QV_WIDE
     const auto blueRed = pairWeights(rows.y[0], rows.y[2]), green = pairWeights(rows.y[1], 0);
     const auto add = hn::Set(hInts, rows.yAdd);
     const auto low = hn::Set(hWords, 255);
@@ -128,7 +54,7 @@ struct ChromaLines {
     }
 };
 
-#if QV_CHROMA
+#if QV_WIDE
 const hn::RepartitionToWide<decltype(hn::Repartition<int32_t, HB>())> hLongs;
 
 // The upper 64 bits of `before` and all but those of `now`.
@@ -211,7 +137,7 @@ void rgb4ToChroma(const ToYuv& rows, const Byte* const lines[4], const Byte weig
     std::copy_n(weights, 4, from.weight);
     const size_t samples = n / 2;
     size_t i = 0;
-#if QV_CHROMA
+#if QV_WIDE
     const bool two = weights[2] == 0 && weights[3] == 0;
     if (filtered)
         i = two ? eachChroma<true, 2>(rows, from, u, v, samples)

@@ -345,123 +345,6 @@ void rgbToYuv(const ToYuv& rows, const Byte* b, const Byte* g, const Byte* r, By
     }
 }
 
-// The rounded product in 15 fraction bits, as the vectors have it.
-HWY_INLINE int fixedProduct(int a, int b) { return (a * b + 16384) >> 15; }
-
-HWY_INLINE void rgbOne(const ToRgb& rows, int y, int u, int v, Byte* bgr) {
-    const int luma = fixedProduct((y - rows.yOffset) * 64, rows.y) + 16;
-    const int cb = (u - 128) * 64, cr = (v - 128) * 64;
-    bgr[0] = clampByte((luma + fixedProduct(cb * 2, rows.cbToB)) >> 5);
-    bgr[1] = clampByte((luma + fixedProduct(cb, rows.cbToG) + fixedProduct(cr, rows.crToG)) >> 5);
-    bgr[2] = clampByte((luma + fixedProduct(cr, rows.crToR)) >> 5);
-}
-
-#if QV_VECTORS
-struct RgbConstants {
-    V16 yOffset, y, cbToB, cbToG, crToG, crToR;
-    explicit RgbConstants(const ToRgb& rows)
-        : yOffset(hn::Set(d16, rows.yOffset)),
-          y(hn::Set(d16, rows.y)),
-          cbToB(hn::Set(d16, rows.cbToB)),
-          cbToG(hn::Set(d16, rows.cbToG)),
-          crToG(hn::Set(d16, rows.crToG)),
-          crToR(hn::Set(d16, rows.crToR)) {}
-};
-
-struct Words3 {
-    V16 b, g, r;
-};
-
-HWY_INLINE Words3 rgbWords(const RgbConstants& k, V16 y, V16 u, V16 v) {
-    const auto centre = hn::Set(d16, 128);
-    const auto luma =
-        hn::Add(hn::MulFixedPoint15(hn::ShiftLeft<6>(hn::Sub(y, k.yOffset)), k.y), hn::Set(d16, 16));
-    const auto cb = hn::ShiftLeft<6>(hn::Sub(u, centre)), cr = hn::ShiftLeft<6>(hn::Sub(v, centre));
-    const auto b = hn::Add(luma, hn::MulFixedPoint15(hn::Add(cb, cb), k.cbToB));
-    const auto g = hn::Add(luma, hn::Add(hn::MulFixedPoint15(cb, k.cbToG), hn::MulFixedPoint15(cr, k.crToG)));
-    const auto r = hn::Add(luma, hn::MulFixedPoint15(cr, k.crToR));
-    return {hn::ShiftRight<5>(b), hn::ShiftRight<5>(g), hn::ShiftRight<5>(r)};
-}
-
-struct Bytes3 {
-    V8 b, g, r;
-};
-
-HWY_INLINE Bytes3 rgbBytes(const RgbConstants& k, V8 y, V8 u, V8 v) {
-    const auto low = rgbWords(k, lowWords(y), lowWords(u), lowWords(v));
-    const auto high = rgbWords(k, highWords(y), highWords(u), highWords(v));
-    return {joinWords(low.b, high.b), joinWords(low.g, high.g), joinWords(low.r, high.r)};
-}
-#endif
-
-// Where RGB goes, by vectors and by single pixels.
-struct ToPlanes {
-    Byte *b, *g, *r;
-    void one(size_t i, const Byte* p) const {
-        b[i] = p[0];
-        g[i] = p[1];
-        r[i] = p[2];
-    }
-#if QV_VECTORS
-    HWY_INLINE void all(size_t i, const Bytes3& p) const {
-        put(p.b, b + i);
-        put(p.g, g + i);
-        put(p.r, r + i);
-    }
-#endif
-};
-
-struct ToFours {
-    Byte* to;
-    void one(size_t i, const Byte* p) const {
-        std::memcpy(to + 4 * i, p, 3);
-        to[4 * i + 3] = 255;
-    }
-#if QV_VECTORS
-    HWY_INLINE void all(size_t i, const Bytes3& p) const {
-        hn::StoreInterleaved4(p.b, p.g, p.r, hn::Set(d8, 255), d8, to + 4 * i);
-    }
-#endif
-};
-
-struct ToThrees {
-    Byte* to;
-    void one(size_t i, const Byte* p) const { std::memcpy(to + 3 * i, p, 3); }
-#if QV_VECTORS
-    HWY_INLINE void all(size_t i, const Bytes3& p) const {
-        hn::StoreInterleaved3(p.b, p.g, p.r, d8, to + 3 * i);
-    }
-#endif
-};
-
-template <class To>
-HWY_INLINE void eachRgb(const ToRgb& rows, const Byte* y, const Byte* u, const Byte* v, size_t n,
-                        const To& to) {
-    size_t i = 0;
-#if QV_VECTORS
-    const RgbConstants k(rows);
-    for (; i + lanes() <= n; i += lanes()) to.all(i, rgbBytes(k, load(y + i), load(u + i), load(v + i)));
-#endif
-    for (; i < n; ++i) {
-        Byte bgr[3];
-        rgbOne(rows, y[i], u[i], v[i], bgr);
-        to.one(i, bgr);
-    }
-}
-
-void yuvToRgb(const ToRgb& rows, const Byte* y, const Byte* u, const Byte* v, Byte* b, Byte* g, Byte* r,
-              size_t n) {
-    eachRgb(rows, y, u, v, n, ToPlanes{b, g, r});
-}
-
-void yuvToRgb4(const ToRgb& rows, const Byte* y, const Byte* u, const Byte* v, Byte* to, size_t n) {
-    eachRgb(rows, y, u, v, n, ToFours{to});
-}
-
-void yuvToRgb3(const ToRgb& rows, const Byte* y, const Byte* u, const Byte* v, Byte* to, size_t n) {
-    eachRgb(rows, y, u, v, n, ToThrees{to});
-}
-
 #if QV_VECTORS
 HWY_INLINE V16 otherWords(const int16_t m[3], V16 y, V16 u, V16 v, int centre) {
     // Pairs of Y U, and of V with the rounding.
@@ -642,14 +525,6 @@ QV_KERNEL(rgbToYuv,
           (rows, b, g, r, y, u, v, n))
 QV_KERNEL(rgb4ToYuv, (const ToYuv& rows, const Byte* from, Byte* y, Byte* u, Byte* v, size_t n),
           (rows, from, y, u, v, n))
-QV_KERNEL(yuvToRgb,
-          (const ToRgb& rows, const Byte* y, const Byte* u, const Byte* v, Byte* b, Byte* g, Byte* r,
-           size_t n),
-          (rows, y, u, v, b, g, r, n))
-QV_KERNEL(yuvToRgb4, (const ToRgb& rows, const Byte* y, const Byte* u, const Byte* v, Byte* to, size_t n),
-          (rows, y, u, v, to, n))
-QV_KERNEL(yuvToRgb3, (const ToRgb& rows, const Byte* y, const Byte* u, const Byte* v, Byte* to, size_t n),
-          (rows, y, u, v, to, n))
 QV_KERNEL(yuvToOther, (const ToOther& rows, Byte* y, Byte* u, Byte* v, size_t n), (rows, y, u, v, n))
 QV_KERNEL(toVideoLevels, (Byte * to, const Byte* from, size_t n), (to, from, n))
 QV_KERNEL(toFullLevels, (Byte * to, const Byte* from, size_t n), (to, from, n))

@@ -30,15 +30,11 @@ void joinYuyv(Byte* to, const Byte* y, const Byte* u, const Byte* v, size_t n, b
 void split565(const Byte* from, Byte* b, Byte* g, Byte* r, size_t n, bool green6);
 void join565(Byte* to, const Byte* b, const Byte* g, const Byte* r, size_t n, bool green6);
 
-// Between planes B, G, R or packed pixels of 3 or 4 bytes and planes of YUV in 4:4:4. The fourth byte is
-// written as 255. `u` and `v` may be null: luma alone.
+// Planes B, G, R or packed pixels of four bytes to planes of YUV in 4:4:4. `u` and `v` may be null: luma
+// alone.
 void rgbToYuv(const ToYuv& rows, const Byte* b, const Byte* g, const Byte* r, Byte* y, Byte* u, Byte* v,
               size_t n);
 void rgb4ToYuv(const ToYuv& rows, const Byte* from, Byte* y, Byte* u, Byte* v, size_t n);
-void yuvToRgb(const ToRgb& rows, const Byte* y, const Byte* u, const Byte* v, Byte* b, Byte* g, Byte* r,
-              size_t n);
-void yuvToRgb4(const ToRgb& rows, const Byte* y, const Byte* u, const Byte* v, Byte* to, size_t n);
-void yuvToRgb3(const ToRgb& rows, const Byte* y, const Byte* u, const Byte* v, Byte* to, size_t n);
 // In place.
 void yuvToOther(const ToOther& rows, Byte* y, Byte* u, Byte* v, size_t n);
 // Full levels to video levels, round(x * 219 / 255) + 16, and back with clamping.

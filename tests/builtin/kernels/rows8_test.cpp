@@ -6,6 +6,7 @@
 #include <cmath>
 
 #include "builtin/kernels/rgbchroma.h"
+#include "builtin/kernels/yuvrgb.h"
 #include "tests/builtin/kernels/units.h"
 
 using namespace srk;
@@ -109,11 +110,21 @@ const LineKernel kernels[] = {
     {"yuvToRgb4",
      {one, one, one},
      {four},
-     [](const LineCase& l) { yuvToRgb4(toRgb(b709, false), l.in[0], l.in[1], l.in[2], l.out[0], l.n); }},
+     [](const LineCase& l) {
+         yuvToRgb4(toRgb(b709, false), l.in[0], l.in[1], l.in[2], l.out[0], l.n, false);
+     }},
     {"yuvToRgb3 video",
      {one, one, one},
      {three},
-     [](const LineCase& l) { yuvToRgb3(toRgb(b709, true), l.in[0], l.in[1], l.in[2], l.out[0], l.n); }},
+     [](const LineCase& l) {
+         yuvToRgb3(toRgb(b709, true), l.in[0], l.in[1], l.in[2], l.out[0], l.n, false);
+     }},
+    {"yuvToRgb4, chroma repeated",
+     {one, half, half},
+     {four},
+     [](const LineCase& l) {
+         if (l.n > 1) yuvToRgb4(toRgb(b601, false), l.in[0], l.in[1], l.in[2], l.out[0], l.n, true);
+     }},
     {"yuvToOther",
      {one, one, one},
      {one, one, one},
@@ -175,6 +186,7 @@ TEST(Rows8, UnitsOfTheMachineReallyRun) {
         const OnTarget only(target);
         EXPECT_STREQ(rows8Unit(), hwy::TargetName(target));
         EXPECT_STREQ(rgbChromaUnit(), hwy::TargetName(target));
+        EXPECT_STREQ(yuvRgbUnit(), hwy::TargetName(target));
     }
 }
 
@@ -193,7 +205,7 @@ TEST(Rows8, MatricesStayNearTheExactFormula) {
                 worst = std::max(
                     {worst, std::abs(y - expected[0]), std::abs(u - expected[1]), std::abs(v - expected[2])});
                 Byte back[4];
-                yuvToRgb4(toRgb(b601, false), &y, &u, &v, back, 1);
+                yuvToRgb4(toRgb(b601, false), &y, &u, &v, back, 1, false);
                 const double exact = (19077.0 * (y - 16) + 26153.0 * (v - 128)) / 16384;
                 ASSERT_LE(std::abs(back[2] - std::clamp(exact, 0.0, 255.0)), 0.6);
                 for (int i = 0; i < 3; ++i)
@@ -212,7 +224,7 @@ TEST(Rows8, GreyHasNoColourAndLevelsMeetTheirEnds) {
                 rgb4ToYuv(toYuv(matrix, video), pixel, &y, &u, &v, 1);
                 ASSERT_EQ(u, 128);
                 ASSERT_EQ(v, 128);
-                yuvToRgb4(toRgb(matrix, video), &y, &u, &v, back, 1);
+                yuvToRgb4(toRgb(matrix, video), &y, &u, &v, back, 1, false);
                 ASSERT_LE(std::abs(back[1] - grey), 1);
                 if (grey == (video ? 235 : 255)) {
                     EXPECT_EQ(y, 235);
