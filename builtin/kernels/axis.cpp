@@ -84,10 +84,11 @@ void roundWeights(std::span<const double> from, std::span<int16_t> to) {
 
 bool isWhole(double value) { return value == std::floor(value); }
 
-// In 1/65536, so that equal ratios give equal weights along the line.
-double positionOf(const Mapping& mapping, int i, int source) {
-    const double exact = mapping.first + i * mapping.step;
-    return std::clamp(std::floor(exact * 65536 + 0.5) / 65536, 0.0, static_cast<double>(source - 1));
+// For bytes in 1/65536, so that equal ratios give equal weights along the line.
+double positionOf(const Mapping& mapping, int i, int source, bool exact) {
+    double at = mapping.first + i * mapping.step;
+    if (!exact) at = std::floor(at * 65536 + 0.5) / 65536;
+    return std::clamp(at, 0.0, static_cast<double>(source - 1));
 }
 
 }  // namespace
@@ -112,7 +113,8 @@ Axis makeAxis(const Mapping& mapping, int source, int target, Filter filter, boo
         axis.weights.resize(count * taps);
     std::vector<double> weights(taps);
     for (std::size_t i = 0; i < count; ++i) {
-        axis.start[i] = weigh(kernel, positionOf(mapping, static_cast<int>(i), source), weights);
+        const bool exact = deep && filter != Filter::nearest;
+        axis.start[i] = weigh(kernel, positionOf(mapping, static_cast<int>(i), source, exact), weights);
         if (deep)
             std::transform(weights.begin(), weights.end(), axis.exact.begin() + static_cast<long>(i * taps),
                            [](double w) { return static_cast<float>(w); });

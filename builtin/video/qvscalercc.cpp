@@ -159,7 +159,7 @@ void QvScalerCC::logStart(const QvFrame& frame) {
 
 int QvScalerCC::write(QvFrame& frame) {
     if (!output_.inited()) return setError(QvStatus::illegalState, "Not opened");
-    if (!frame.inited()) return setError(QvStatus::invalidArgument, "can not setup scaler call");
+    if (!frame.inited()) return setError(QvStatus::failed, "can not setup scaler call");
     logStart(frame);
     if (settings_.outWidth < leastSize || settings_.outHeight < leastSize) return writeBlack(frame);
     return convert(frame);

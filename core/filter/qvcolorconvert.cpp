@@ -93,7 +93,7 @@ int QvColorConverter::_reopenConverter(const QvFrame& in) {
     codec_->setParam("outWidth", width_);
     codec_->setParam("outHeight", height_);
     const int result = codec_->open();
-    if (result != QvStatus::ok) width_ = height_ = 0;  // so that the next frame tries again
+    open_ = result == QvStatus::ok;
     return result;
 }
 

@@ -18,7 +18,8 @@ class QV_API QvColorConverter {
     QvColorConverter(const QvColorConverter&) = delete;
     QvColorConverter& operator=(const QvColorConverter&) = delete;
 
-    // `out` becomes the converted picture with the metadata of `in`. 0, or a status with a line in the log.
+    // `out` becomes the converted picture with the metadata of `in`. 0, or a status with a line in the log. A
+    // size that no picture can be made of ends the converter: it asserts from then on.
     int convert(const QvFrame& in, QvFrame& out);
 
   private:

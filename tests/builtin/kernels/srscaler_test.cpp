@@ -13,6 +13,7 @@
 #include "builtin/kernels/paths.h"
 #include "core/media/fourcc.h"
 #include "tests/builtin/kernels/guarded.h"
+#include "tests/builtin/kernels/targets.h"
 
 namespace {
 
@@ -135,6 +136,75 @@ TEST(Conversion, NothingOutsideOfThePicturesIsTouched) {
                 }
 }
 
+namespace {
+
+// A picture in its own memory, whose lines follow each other downwards or upwards.
+struct Held {
+    srk::Picture layout;
+    Bytes memory;
+    QvScalePicture record{};
+
+    Held(const std::string& name, int w, int h, bool upwards) : memory(bytesOf(name, w, h), 7) {
+        const int number = srk::formatNumber(codeOf(name));
+        layout.format = &srk::formats()[static_cast<size_t>(number & 0xffff)];
+        layout.width = w;
+        layout.height = h;
+        srk::layOut(layout, memory.data(), 0);
+        record = {qvFourcc("EXT1"), codeOf(name), w, h, 0, 0, 0, {}};
+        int* const strides[3] = {&record.stride, &record.stride1, &record.stride2};
+        for (int p = 0; p < layout.format->planes(); ++p) {
+            auto& plane = layout.planes[p];
+            if (upwards) plane = {plane.data + plane.stride * (layout.planeHeight(p) - 1), -plane.stride};
+            // The record has the format's order.
+            const int at =
+                p && !layout.format->has(srk::uBeforeV) && layout.format->planes() == 3 ? 3 - p : p;
+            *strides[at] = static_cast<int>(plane.stride);
+            record.planes[at] = plane.data;
+        }
+    }
+    // The bytes of all lines from the top.
+    template <class Each>
+    void eachByte(const Each& each) {
+        for (int p = 0; p < layout.format->planes(); ++p)
+            for (int y = 0; y < layout.planeHeight(p); ++y)
+                for (long long x = 0; x < srk::lineBytes(*layout.format, layout.width, p); ++x)
+                    each(layout.planes[p].data[layout.planes[p].stride * y + x]);
+    }
+};
+
+}  // namespace
+
+TEST(Conversion, EveryPairIsTheSameOnEveryUnitAndWithEitherSignOfStride) {
+    const auto names = formatNames();
+    unsigned turn = 0;
+    for (const auto& from : names)
+        for (const auto& to : names)
+            for (const unsigned flags : {QvScale::nearest, QvScale::standard | QvScale::target709,
+                                         QvScale::high | QvScale::interlaced}) {
+                const int w = 1 + static_cast<int>(++turn * 7 % 75), h = 1 + static_cast<int>(turn % 6);
+                const int tw = turn % 3 ? w : 1 + static_cast<int>(turn * 11 % 90);
+                Bytes expected;
+                for (const bool upwards : {false, true})
+                    for (const auto target : machineTargets()) {
+                        Held source(from, w, h, upwards), made(to, tw, h, upwards);
+                        unsigned value = turn;
+                        source.eachByte([&](unsigned char& byte) {
+                            byte = static_cast<unsigned char>((value = value * 1664525u + 1013904223u) >> 24);
+                        });
+                        const OnTarget only(target);
+                        ASSERT_EQ(SRScaler(QvScale::oneThread, source.record.tag, &source.record, 0, 0, 0,
+                                           made.record.tag, &made.record, 0, 0, 0, 0, flags, nullptr),
+                                  1);
+                        Bytes bytes;
+                        made.eachByte([&](unsigned char byte) { bytes.push_back(byte); });
+                        if (expected.empty()) expected = bytes;
+                        ASSERT_EQ(bytes, expected)
+                            << from << " to " << to << ' ' << w << 'x' << h << " to " << tw << " flags "
+                            << flags << (upwards ? " upwards on " : " on ") << hwy::TargetName(target);
+                    }
+            }
+}
+
 TEST(Conversion, TenBitsComeBackAsTheyWere) {
     constexpr int w = 50, h = 4;
     Guarded words(bytesOf("Y210", w, h), 8);
@@ -180,9 +250,9 @@ TEST(Scaling, FlatStaysFlatAtAnySize) {
                                            {33, 17, 1, 1}})
             for (const unsigned field : {0u, QvScale::interlaced}) {
                 for (const char* name : {"I420", "BGR4", "W016", "YVU9"}) {
+                    if (name[0] == 'W' && tw % 2) continue;  // lines with a byte to spare
                     Bytes from(bytesOf(name, w, h), 99), to(bytesOf(name, tw, th), 7);
                     ASSERT_EQ(convert(name, from.data(), w, h, name, to.data(), tw, th, kind | field), 1);
-                    if (std::string(name) == "W016") continue;
                     for (size_t i = 0; i < to.size(); ++i) {
                         if (std::string(name) == "BGR4" && i % 4 == 3) continue;
                         ASSERT_EQ(to[i], 99)
