@@ -246,12 +246,11 @@ void QvScalerCC::repeatLastChroma(const QvFrame& frame) {
 }
 
 void QvScalerCC::finish(const QvFrame& frame) {
-    output_.copyMeta(frame);
     int matrix = settings_.outITU;
     if (hasNoMatrix(output_))
         matrix = qvMatrixNotSet;
     else if (matrix != qvMatrixBT601 && matrix != qvMatrixBT709)
         matrix = output_.height() < hdLines ? qvMatrixBT601 : qvMatrixBT709;
-    output_.setYUVMatrix(static_cast<QvYUVMatrix>(matrix));
+    output_.copyMeta(frame, static_cast<QvYUVMatrix>(matrix));
     ready_ = 1;
 }

@@ -110,8 +110,9 @@ class QV_API QvFrame {
 
     // --- Whole pictures. The target takes format, rate, frameNr and metadata of the source. Rows are as long
     // as the smaller stride.
-    int copy(const QvFrame& src, bool flip = false);  // flip: bottom-up, with the field order reversed
-    void copyMeta(const QvFrame& src);                // rate, frameNr and metadata only
+    int copy(const QvFrame& src, bool flip = false);        // flip: bottom-up, with the field order reversed
+    void copyMeta(const QvFrame& src);                      // rate, frameNr and metadata only
+    void copyMeta(const QvFrame& src, QvYUVMatrix matrix);  // and this matrix in the place of the source's
     // Pixels only. Strides of `tt` may be negative; with keepStrides they are wished for if the format
     // differs.
     int copyFramett(const frame_tt& tt, bool keepStrides);
@@ -174,6 +175,7 @@ class QV_API QvFrame {
     AnyDict meta_;
     std::unique_ptr<unsigned char[], Release> memory_;
 
+    void _copyMeta(const QvFrame& src, const char* kept);  // null, or the key of an entry that is left alone
     bool sameFormat(unsigned four_cc, int width, int height) const;
     int takeFormat(unsigned four_cc, int width, int height);
     std::ptrdiff_t pixelOffset(int x, int y, int plane) const;

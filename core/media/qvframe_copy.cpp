@@ -1,6 +1,7 @@
 // Copies of whole pictures, row by row, and of their fields.
 #include <algorithm>
 #include <cstdlib>
+#include <cstring>
 #include <limits>
 
 #include "core/engine/qvlog.h"
@@ -66,10 +67,19 @@ int QvFrame::copy(const QvFrame& src, bool flip) {
     return status;
 }
 
-void QvFrame::copyMeta(const QvFrame& src) {
+void QvFrame::copyMeta(const QvFrame& src) { _copyMeta(src, nullptr); }
+
+// Entry by entry: those that are there already take the new values without a new place in memory.
+void QvFrame::_copyMeta(const QvFrame& src, const char* kept) {
     framerate = src.framerate;
     frameNr = src.frameNr;
-    meta_ = src.meta_;
+    if (&src == this) return;
+    for (int i = meta_.size() - 1; i >= 0; --i) {
+        const char* key = meta_.getKey(i);
+        if (!src.meta_.isSet(key) && !(kept && std::strcmp(key, kept) == 0)) meta_.remove(key);
+    }
+    for (auto [key, value] : src.meta_)
+        if (!(kept && std::strcmp(key, kept) == 0)) meta_.set(key, *value);
 }
 
 int QvFrame::copyFramett(const frame_tt& tt, bool keepStrides) {

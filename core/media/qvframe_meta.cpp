@@ -20,6 +20,11 @@ QvYUVMatrix QvFrame::YUVMatrix() const {
 
 void QvFrame::setYUVMatrix(QvYUVMatrix matrix) { meta_.set(matrixKey, Any(static_cast<int>(matrix))); }
 
+void QvFrame::copyMeta(const QvFrame& src, QvYUVMatrix matrix) {
+    _copyMeta(src, matrixKey);
+    setYUVMatrix(matrix);
+}
+
 QvUserData* QvFrame::userData() const {
     return static_cast<QvUserData*>(meta_.get(userDataKey).asGeneric(nullptr));
 }

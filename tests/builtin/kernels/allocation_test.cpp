@@ -5,9 +5,13 @@
 #include <tuple>
 #include <vector>
 
+#include "builtin/pipes/qvvideopipe.h"
+#include "core/engine/qvregistry.h"
 #include "core/filter/srscaler.h"
 #include "core/media/fourcc.h"
+#include "core/media/qvframe.h"
 #include "tests/support/counted_memory.h"
+#include "tests/support/engine.h"
 
 TEST(Memory, IsTakenForTheFirstPictureOnly) {
     std::vector<unsigned char> from(64 * 48 * 8, 3), to(96 * 80 * 8);
@@ -29,4 +33,38 @@ TEST(Memory, IsTakenForTheFirstPictureOnly) {
         run(5);
         EXPECT_EQ(allocations, before) << source << " to " << target;
     }
+}
+
+TEST(Memory, OfAChainOfFiltersIsTakenForTheFirstPicturesOnly) {
+    const EngineScope engine;
+    QvVf pipe;
+    for (const char* name : {"scaler", "brightness", "flipper", "videofade", "scaler"}) {
+        auto* filter = static_cast<QvVideoFilter*>(qv_registry()->newCodec(name)->getInterface(12));
+        ASSERT_EQ(pipe.addFilter(filter, -1), 0);
+    }
+    pipe.init();
+    const auto size = [&](int at, const char* fourcc, int width, int height) {
+        pipe.filter(at)->setParam("outWidth", width);
+        pipe.filter(at)->setParam("outHeight", height);
+        pipe.filter(at)->setParam("FOURCC", fourcc);
+    };
+    size(0, "I420", 128, 96);
+    pipe.filter(1)->setParam("contrast", 1.2);
+    pipe.filter(3)->setParam("fade_in", 50);
+    size(4, "BGR3", 64, 64);
+    ASSERT_EQ(pipe.open(), 0);
+    QvFrame in;
+    in.init(QvFourcc::YUYV, 160, 120);
+    std::memset(in.plane(), 120, static_cast<size_t>(in.total_bytes()));
+    int taken = 0;
+    for (int i = 0; i < 12; ++i) {
+        in.frameNr = i;
+        const int before = allocations;
+        ASSERT_EQ(pipe.write(in), 0);
+        ASSERT_EQ(pipe.process(nullptr, 0), 0);
+        ASSERT_EQ(pipe.frame()->width(), 64);
+        pipe.next();
+        if (i >= 2) taken += allocations - before;
+    }
+    EXPECT_EQ(taken, 0);
 }
