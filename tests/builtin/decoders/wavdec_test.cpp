@@ -53,7 +53,7 @@ TEST_F(Wav, DescribesAndDeliversItsStream) {
 TEST_F(Wav, ReadsOfAnySizeAndSeeksGiveTheSameBytes) {
     const std::string data = patternBytes(4 * 70000);
     ASSERT_EQ(open(stereo16(data)), 0);
-    for (const int block : {1, 7, 4096, 5000, 65536, 70000, 2000000000}) {
+    for (const int block : {1, 7, 4096, 4097, 65536, 70000, 2000000000}) {
         ASSERT_EQ(decoder.seekToSample(0, 0), 0);
         EXPECT_TRUE(readAll(block) == data) << block;
     }

@@ -27,7 +27,8 @@ class DecoderState : public testing::Test {
 
     // The one folder that the manager made for `file`.
     fs::path kept() const {
-        for (const auto& entry : fs::directory_iterator(folder.path() / "index")) return entry.path();
+        for (const auto& entry : fs::directory_iterator(folder.path() / "index"))
+            if (entry.is_directory()) return entry.path();
         return {};
     }
     void rewriteDocument(const std::string& from, const std::string& to) {
@@ -97,7 +98,11 @@ TEST_F(DecoderState, DamageCountsAsNotStored) {
         {"no time", [this] { rewriteDocument("modified", "modifies"); }},
         {"no block", [this] { fs::remove(kept() / "my_index.dat"); }},
         {"a cut block", [this] { fs::resize_file(kept() / "my_index.dat", 30); }},
-        {"a name that leads out", [this] { rewriteDocument("BLOB_my_index", "BLOB_../my_index"); }},
+        {"a name that leads out to a good block",
+         [this] {
+             fs::copy_file(kept() / "my_index.dat", kept() / "../my_index.dat");
+             rewriteDocument("BLOB_my_index", "BLOB_../my_index");
+         }},
     };
     for (const auto& c : cases) {
         ASSERT_EQ(manager.storeState(file, sample()), 0) << c.what;
