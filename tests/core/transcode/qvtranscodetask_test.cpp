@@ -162,6 +162,8 @@ TEST(TaskChecks, StreamsAndViews) {
     job.pipe.video.params.set("nrViews", 2);
     LogCapture log;
     EXPECT_EQ(job.task.checkStreams(), 0);
+    job.pipe.video.params.set("nrViews", 3);
+    EXPECT_EQ(job.task.checkStreams(), 0);
     EXPECT_TRUE(
         log.contains("Source contains 3 views and encoder requires 2, views above 2 will be discarded.",
                      QvLogMask::warning));
