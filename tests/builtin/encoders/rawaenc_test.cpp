@@ -4,30 +4,14 @@
 
 #include "builtin/encoders/qvdummyaudio.h"
 #include "builtin/modules.h"
-#include "builtin/muxers/nullmux.h"
 #include "core/media/qvgeometry.h"
 #include "core/stream/auxinfoid.h"
 #include "tests/support/checks.h"
+#include "tests/support/fake_muxer.h"
 #include "tests/support/pictures.h"
 #include "tests/support/test_stream.h"
 
 namespace {
-
-// A multiplexer that only has a name.
-class NamedMuxer : public NullMux {
-  public:
-    explicit NamedMuxer(const char* name) : name_(name) {}
-    const char* name() const override { return name_; }
-    int setParam(const char* name, const Any& value) override {
-        if (std::string(name) == "unknown") return _raiseInvalidParam(name);
-        given.set(name, value);
-        return 0;
-    }
-    AnyDict given;
-
-  private:
-    const char* name_;
-};
 
 class RawAudio : public testing::Test {
   protected:
@@ -43,7 +27,7 @@ class RawAudio : public testing::Test {
     void start(const char* muxerName) {
         out_.data.clear();
         out_.units.clear();
-        muxer_ = std::make_unique<NamedMuxer>(muxerName);
+        muxer_ = std::make_unique<FakeMuxer>(muxerName);
         out_.setOwner(muxer_.get());
         ASSERT_EQ(enc().attachOutStream(&out_), 0);
         ASSERT_EQ(enc().open(), 0);
@@ -56,7 +40,7 @@ class RawAudio : public testing::Test {
     RawAudioEncoderModule module_;
     TestStream out_;
     QvPcm pcm_;
-    std::unique_ptr<NamedMuxer> muxer_;
+    std::unique_ptr<FakeMuxer> muxer_;
     std::unique_ptr<RawAudioEnc> enc_{static_cast<RawAudioEnc*>(module_.create())};
 };
 
@@ -154,12 +138,13 @@ TEST(DummyAudio, HandsParametersAndSamplesToTheMultiplexer) {
     EXPECT_EQ(enc.attachOutStream(&out), -1);
     EXPECT_STREQ(enc.errorDesc(), "Can  not attach dummy audio, output not a muxer");
     EXPECT_EQ(enc.open(), -1);
-    NamedMuxer muxer("dvmux");
+    FakeMuxer muxer("dvmux");
+    muxer.refused.set("unknown", 1);
     out.setAtachee(&muxer);
     ASSERT_EQ(enc.attachOutStream(&out), 0);
-    EXPECT_EQ(muxer.given, AnyDict("samplerate", 32000));
+    EXPECT_EQ(muxer.params, AnyDict("samplerate", 32000));
     enc.setParam("channels", 4);
-    EXPECT_EQ(muxer.given.getInt32("channels"), 4);
+    EXPECT_EQ(muxer.params.getInt32("channels"), 4);
     ASSERT_EQ(enc.open(), 0);
     QvPcm pcm;
     fillSound(pcm, 30, 4, 2, 32000);
