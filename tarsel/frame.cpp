@@ -6,6 +6,7 @@
 #include "commands.h"
 #include "failure.h"
 #include "outputs.h"
+#include "picturereader.h"
 #include "source.h"
 #include "timespec.h"
 
@@ -18,28 +19,19 @@ constexpr int kGap = 8;            // pixels between its pictures
 
 struct Given {
     std::string input, raw, at, output, sheet;
+    EffectOptions effects;
     bool overwrite = false;
     std::shared_ptr<Outputs> outputs;
     Signals* signals = nullptr;
 };
 
-const QvFrame& readAt(Source& source, long long frame) {
-    QvDecodePipe& decoder = source.decoder();
-    if (decoder.seekToFrame(frame, 0) != QvStatus::ok || decoder.readFrame(0) != QvStatus::ok)
-        throw Failure(Exit::input, "can't read frame " + std::to_string(frame) + " of " +
-                                       inQuotes(source.name()) + ": " + decoder.errorDesc());
-    return *decoder.getFramePtr(0);
-}
-
 // Scales and converts pictures of one source to BGR3 of one size.
 class Shrinker {
   public:
-    Shrinker(const QvFrame& first, int width, int height)
-        : scaler_(makeCodec<QvVideoFilter>("scaler", kVideoFilter)) {
+    Shrinker(int width, int height) : scaler_(makeCodec<QvVideoFilter>("scaler", kVideoFilter)) {
         setChecked(*scaler_, "outWidth", width, "--sheet");
         setChecked(*scaler_, "outHeight", height, "--sheet");
         setChecked(*scaler_, "FOURCC", static_cast<int>(QvFourcc::BGR3), "--sheet");
-        static_cast<void>(first);
         if (scaler_->open() != QvStatus::ok) throw Failure(Exit::failed, scaler_->errorDesc());
     }
     ~Shrinker() { scaler_->close(); }
@@ -73,26 +65,21 @@ void save(const QvFrame& picture, const Given& given) {
     std::fprintf(stderr, "tarsel: wrote %s\n", inQuotes(given.output).c_str());
 }
 
-void saveSheet(Source& source, const Given& given, long long frames) {
+void saveSheet(PictureReader& reader, const Given& given) {
     const Size grid = parseSize(given.sheet, "--sheet");
     if (grid.width > 32 || grid.height > 32)
         throw Failure(Exit::usage, "--sheet: at most 32x32 pictures fit on a sheet");
-    const Any aspectParam = source.decoder().getVideoParam(0, "frameAspect");
-    const QvFrame& first = readAt(source, 0);
-    const double aspect = aspectParam.isDouble() && aspectParam.asDouble() > 0
-                              ? aspectParam.asDouble()
-                              : static_cast<double>(first.width(0)) / first.height(0);
     const int width = ((kSheetWidth - kGap) / grid.width - kGap) & ~1;
-    const int height = std::max(2, static_cast<int>(std::lround(width / aspect)) & ~1);
+    const int height = std::max(2, static_cast<int>(std::lround(width / reader.format().aspect)) & ~1);
     QvFrame sheet;
     sheet.init(QvFourcc::BGR3, grid.width * (width + kGap) + kGap, grid.height * (height + kGap) + kGap);
     sheet.setRGB(24, 24, 24);
-    Shrinker shrinker(first, width, height);
+    Shrinker shrinker(width, height);
     QvFrame cell;
     const int count = grid.width * grid.height;
     for (int i = 0; i < count; ++i) {
         // The middle of each of `count` equal parts of the video.
-        shrinker.convert(readAt(source, (2LL * i + 1) * frames / (2LL * count)), cell);
+        shrinker.convert(reader.at((2LL * i + 1) * reader.frames() / (2LL * count)), cell);
         sheet.clip(cell, 0, 0, kGap + i % grid.width * (width + kGap),
                    kGap + i / grid.width * (height + kGap), width, height);
     }
@@ -100,6 +87,7 @@ void saveSheet(Source& source, const Given& given, long long frames) {
 }
 
 void frame(Given& given) {
+    given.effects.check();
     const Any extension = QvFile::getExt(Any(given.output.c_str()), true);
     if (!(extension == "png"))
         throw Failure(Exit::usage, "-o " + inQuotes(given.output) + ": a picture is a .png file");
@@ -108,15 +96,15 @@ void frame(Given& given) {
     if (source.decoder().nrStreams(1) == 0)
         throw Failure(Exit::input, inQuotes(given.input) + " has no picture");
     source.selectAll();
-    const long long frames = source.decoder().nrFrames(0);
-    if (!given.sheet.empty()) return saveSheet(source, given, frames);
+    PictureReader reader(source, given.effects);
+    if (!given.sheet.empty()) return saveSheet(reader, given);
     const auto rate = source.frameRate();
     const MediaTime at = given.at.empty() ? MediaTime(0LL, kTicks) : parseTime(given.at, rate, "--at");
-    const long long number = rate ? at.position(*rate) : 0;
-    if (number >= frames)
+    if (rate && at.position(*rate) >= source.decoder().nrFrames(0))
         throw Failure(Exit::usage, "--at " + given.at + " lies behind the end of " + inQuotes(given.input) +
                                        " (" + formatTime(source.duration()) + ")");
-    save(readAt(source, number), given);
+    const long long number = rate ? at.position(reader.format().rate) : 0;
+    save(reader.at(std::min(number, reader.frames() - 1)), given);
 }
 
 }  // namespace
@@ -132,6 +120,7 @@ void addFrame(CLI::App& app, Action& chosen, Signals& signals) {
     command->add_option("--raw", given->raw, "Format of a raw file: size=WxH,pixel=FORMAT,rate=R")
         ->type_name("K=V,...");
     command->add_option("-o,--output", given->output, "The picture")->type_name("FILE.png")->required();
+    addEffectOptions(*command, given->effects);
     command->add_flag("-y,--overwrite", given->overwrite, "Overwrite an existing picture");
     command->callback([&chosen, given] { chosen = [given] { frame(*given); }; });
 }

@@ -1,12 +1,10 @@
 #include "job.h"
 
 #include <algorithm>
-#include <charconv>
 #include <cstdio>
 #include <filesystem>
 #include <new>
 
-#include "keyvalues.h"
 #include "timespec.h"
 
 namespace fs = std::filesystem;
@@ -31,33 +29,9 @@ constexpr KindRow kKinds[] = {
     {"v210", OutputKind::raw},
 };
 
-// A value of --filter as the type that it looks like.
-Any valueOf(const std::string& text) {
-    char* end = nullptr;
-    const long long whole = std::strtoll(text.c_str(), &end, 10);
-    if (!text.empty() && *end == '\0' && whole >= INT32_MIN && whole <= INT32_MAX)
-        return Any(static_cast<int>(whole));
-    double number = 0;
-    const auto [rest, error] = std::from_chars(text.data(), text.data() + text.size(), number);
-    if (error == std::errc() && rest == text.data() + text.size()) return Any(number);
-    return Any(text.c_str());
-}
-
 int intParam(const QvDecodePipe& decoder, int type, int stream, const char* name) {
     const Any value = decoder.getStreamParam(type, stream, name);
     return value.isInt32() ? value.asInt32() : 0;
-}
-
-// The type of the streams that a filter of this name works on.
-int filterType(const std::string& name) {
-    const QvModule* module = qv_registry()->module(name.c_str());
-    const int kind = module ? module->getAttr("type").toInt32() : 0;
-    if (kind == kVideoFilter) return kVideo;
-    if (kind == kAudioFilter) return kAudio;
-    std::vector<std::string> known = moduleNames(kVideoFilter);
-    for (const auto& audio : moduleNames(kAudioFilter)) known.push_back(audio);
-    throw Failure(Exit::module, "--filter: there is no filter " + inQuotes(name) + "." +
-                                    suggestion(name, known) + " 'tarsel modules' lists all");
 }
 
 }  // namespace
@@ -174,14 +148,13 @@ void Job::planStream(Source& source, int type, int number) {
     stream.encStream = static_cast<int>(
         std::count_if(streams_.begin(), streams_.end(), [&](const auto& s) { return s.type == type; }));
     if (type == kVideo) {
-        stream.width = options_.size ? options_.size->width : intParam(decoder, type, number, "width");
-        stream.height = options_.size ? options_.size->height : intParam(decoder, type, number, "height");
-        stream.fourcc = options_.pixel ? *options_.pixel
-                                       : static_cast<unsigned>(intParam(decoder, type, number, "FOURCC"));
-        const Any rate = decoder.getStreamParam(type, number, "framerate");
-        stream.rate = options_.rate        ? *options_.rate
-                      : rate.isFramerate() ? rate.asFramerate()
-                                           : QvFramerate(25.0);
+        stream.picture =
+            std::make_shared<PictureEffects>(options_.effects, source, number, kind_ == OutputKind::pictures);
+        const PictureFormat& out = stream.picture->out();
+        stream.width = out.width;
+        stream.height = out.height;
+        stream.fourcc = out.fourcc;
+        stream.rate = out.rate;
     } else {
         stream.samplerate = options_.samplerate.value_or(intParam(decoder, type, number, "samplerate"));
         stream.channels = options_.channels.value_or(intParam(decoder, type, number, "channels"));
@@ -325,52 +298,67 @@ void Job::checkNames() const {
         outputs_->checkFinal(outputs_->finalName(names.asVector().at(i).asString(), "raw"));
 }
 
-// The converters that stand between the formats of input and output.
-void Job::checkConverters(const JobStream& stream) const {
+// What was asked for has to have something that it works on.
+void Job::checkEffects() const {
+    if (const std::string option = options_.effects.given(); !option.empty() && !hasVideo())
+        throw Failure(Exit::usage, option + ": this job has no picture");
+    for (const auto& spec : options_.effects.filters) {
+        const int type = filterType(spec);
+        if (std::any_of(streams_.begin(), streams_.end(), [&](const auto& s) { return s.type == type; }))
+            continue;
+        throw Failure(Exit::usage, "--filter " + spec.substr(0, spec.find(':')) + ": this job has no " +
+                                       (type == kVideo ? "picture" : "sound"));
+    }
+}
+
+void Job::planFilters() {
+    checkEffects();
+    for (JobStream& stream : streams_) {
+        if (!options_.from.empty() || !options_.to.empty())
+            stream.params.setInOutPoints(InOutPoints(stream.in, stream.out));
+        stream.type == kVideo ? planPicture(stream) : planSound(stream);
+    }
+    takeWarnings();
+}
+
+void Job::planPicture(JobStream& stream) const {
+    if (kind_ == OutputKind::pictures) makeAnyCodec("scaler", kVideoFilter);
+    const FiltersState state = stream.picture->filters(stream.expected, false);
+    if (!state.empty()) stream.params.setFilters(state);
+    const auto pipe = tryPipe(stream.picture->job(state));
+    stream.chain = describe(pipe.get());
+}
+
+void Job::planSound(JobStream& stream) const {
     const QvDecodePipe& decoder = stream.source->decoder();
     const auto differs = [&](const char* name, int wanted) {
         return intParam(decoder, stream.type, stream.decStream, name) != wanted;
     };
-    if (stream.type == kAudio) {
-        if (differs("samplerate", stream.samplerate)) makeAnyCodec("srconvert", kAudioFilter);
-        if (differs("channels", stream.channels)) makeAnyCodec("chconvert", kAudioFilter);
-        // Filters work on 32 bits.
-        if (differs("bitsPerSample", stream.bits) || stream.params.filters())
-            makeAnyCodec("aquant", kAudioFilter);
-        return;
+    FiltersState state;
+    for (const auto& spec : options_.effects.filters) {
+        if (filterType(spec) != kAudio) continue;
+        state.appendFilter(spec.c_str(), filterState(spec));
+        stream.chain.push_back(spec);
     }
-    if (differs("width", stream.width) || differs("height", stream.height) ||
-        differs("FOURCC", static_cast<int>(stream.fourcc)) || kind_ == OutputKind::pictures)
-        makeAnyCodec("scaler", kVideoFilter);
-    const Any rate = decoder.getStreamParam(stream.type, stream.decStream, "framerate");
-    if (rate.isFramerate() && !(rate.asFramerate() == stream.rate)) makeAnyCodec("frconvert", kVideoFilter);
+    if (!state.empty()) stream.params.setFilters(state);
+    if (differs("samplerate", stream.samplerate)) makeAnyCodec("srconvert", kAudioFilter);
+    if (differs("channels", stream.channels)) makeAnyCodec("chconvert", kAudioFilter);
+    // Filters work on 32 bits.
+    if (differs("bitsPerSample", stream.bits) || stream.params.filters())
+        makeAnyCodec("aquant", kAudioFilter);
 }
 
-void Job::planFilters() {
-    for (JobStream& stream : streams_)
-        if (!options_.from.empty() || !options_.to.empty())
-            stream.params.setInOutPoints(InOutPoints(stream.in, stream.out));
-    FiltersState states[2];
-    for (const auto& spec : options_.filters) {
-        const size_t colon = spec.find(':');
-        const std::string name = spec.substr(0, colon), option = "--filter " + name;
-        const int type = filterType(name);
-        if (std::none_of(streams_.begin(), streams_.end(), [&](const auto& s) { return s.type == type; }))
-            throw Failure(Exit::usage,
-                          option + ": this job has no " + (type == kVideo ? "picture" : "sound"));
-        const auto filter = makeAnyCodec(name, type == kVideo ? kVideoFilter : kAudioFilter);
-        const KeyValues keys(colon == std::string::npos ? "" : spec.substr(colon + 1), {}, option);
-        for (const auto& [key, value] : keys.all()) setChecked(*filter, key, valueOf(value), option);
-        // Two frames of each interlaced one are made first, so that scaling and a further change of the rate
-        // work on whole pictures.
-        if (filter->getParam("_rateFactor").asInt32(1) > 1 && !keys.find("_front"))
-            filter->setParam("_front", 1);
-        AnyDict stored;
-        filter->store(stored);
-        stored.set("_on", 1);
-        states[type - 1].appendFilter(name.c_str(), stored);
+// What the engine told its user, each line once.
+void Job::takeWarnings() {
+    constexpr int warning = 4;
+    AnyVector messages;
+    qv_log()->getAll(messages);
+    for (int i = 0; i < messages.size(); ++i) {
+        const AnyDict& message = messages.at(i).asDict();
+        const std::string text = inLine(message.getString("text", ""));
+        if (message.getInt32("type", 0) == warning &&
+            std::find(warnings_.begin(), warnings_.end(), text) == warnings_.end())
+            warnings_.push_back(text);
     }
-    for (JobStream& stream : streams_)
-        if (!states[stream.type - 1].empty()) stream.params.setFilters(states[stream.type - 1]);
-    for (const JobStream& stream : streams_) checkConverters(stream);
+    qv_log()->clear();
 }

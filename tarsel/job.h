@@ -10,6 +10,7 @@
 
 #include "failure.h"
 #include "outputs.h"
+#include "picture.h"
 #include "progress.h"
 #include "signals.h"
 #include "source.h"
@@ -18,11 +19,8 @@
 struct JobOptions {
     std::vector<std::string> inputs;
     std::string output, raw, from, to, muxer, post, saveTask;
-    std::optional<Size> size;
-    std::optional<QvFramerate> rate;
-    std::optional<unsigned> pixel;
+    EffectOptions effects;
     std::optional<int> samplerate, channels, bits;
-    std::vector<std::string> filters;
     ProgressMode progress = ProgressMode::automatic;
     bool overwrite = false, splitChannels = false, dryRun = false, acceptPartial = false, quiet = false;
 };
@@ -36,6 +34,7 @@ struct JobStream {
     Source* source;
     int decStream, encStream;
     // The format of the output.
+    std::shared_ptr<const PictureEffects> picture;  // of video
     int width = 0, height = 0;
     unsigned fourcc = 0;
     QvFramerate rate;
@@ -47,6 +46,7 @@ struct JobStream {
     long long frame = 0;     // audio: most samples that belong to one frame of the picture; 0 without one
     long long written = -1;  // after the run
     ProcessParams params;
+    std::vector<std::string> chain;          // a line for each filter
     long long bytes(long long units) const;  // without headers
 };
 
@@ -72,7 +72,10 @@ class Job {
     void planPoints();
     void planLengths();
     void planFilters();
-    void checkConverters(const JobStream& stream) const;
+    void planPicture(JobStream& stream) const;
+    void planSound(JobStream& stream) const;
+    void checkEffects() const;
+    void takeWarnings();
     void checkPicture() const;
     void buildPipe();
     void addStream(JobStream& stream);

@@ -26,7 +26,7 @@ void Job::printPlan() const {
         print("stream  %s %d of %s, %s to %s\n", s.type == 1 ? "video" : "audio", s.decStream,
               inQuotes(s.source->name()).c_str(), formatTime(s.in.seconds()).c_str(),
               formatTime(s.out.seconds()).c_str());
-        for (const auto& filter : options_.filters) print("filter  %s\n", filter.c_str());
+        for (const auto& filter : s.chain) print("filter  %s\n", filter.c_str());
         print("encoder %s: %s\n", pipe_->encoder(s.type, s.encStream)->name(), formatOf(s).c_str());
         print("expect  %lld %s, %lld bytes\n", s.expected, s.type == 1 ? "frames" : "samples",
               s.bytes(s.expected));

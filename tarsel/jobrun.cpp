@@ -27,6 +27,7 @@ class Job::Runner : public QvTranscoder {
         for (JobStream& stream : job_.streams_)
             if (TransLink* link = getLinkForOutput(stream.type, stream.encStream))
                 stream.written = link->outProcessed();
+        takeFilterFailure();
         last_ = state("closing");
         return 0;
     }
@@ -88,13 +89,28 @@ class Job::Runner : public QvTranscoder {
         return s;
     }
     const ProgressState& last() const { return last_; }
+    // Why a filter could not do its work; the others went on without it.
+    const std::string& filterFailure() const { return filterFailure_; }
 
   private:
+    void takeFilterFailure() {
+        for (const JobStream& stream : job_.streams_) {
+            const TransLink* link = getLinkForOutput(stream.type, stream.encStream);
+            const Any& filters = stream.params.get("filters");
+            if (!link || stream.type != 1 || !filters.isDict()) continue;
+            for (const Any& name : FiltersState(filters.asDict()).names(true))
+                for (int i = 0; const QvCodec* filter = link->filter(name.asString(""), i); ++i)
+                    if (filter->errorCode() != 0 && filterFailure_.empty())
+                        filterFailure_ = std::string(filter->name()) + ": " + inLine(filter->errorDesc());
+        }
+    }
+
     static constexpr auto kSlowStop = std::chrono::seconds(1);
 
     Job& job_;
     Progress& progress_;
     ProgressState last_;
+    std::string filterFailure_;
     std::atomic<bool> stop_{false};
     std::mutex lock_;
     std::condition_variable changed_;
@@ -156,6 +172,9 @@ void Job::run() {
         const int result = runLinked(runner, progress);
         if (const Exit signalled = signals_.received(); signalled != Exit::done) stopped(signalled);
         if (result != 0 && result != QvStatus::endOfStream) fail(runner);
+        if (!runner.filterFailure().empty())
+            throw Failure(Exit::failed, "the filter " + runner.filterFailure() + "; nothing was left behind");
+        takeWarnings();
         checkResult();
         if (outputs_) names = outputs_->commit("raw");
     }

@@ -1,4 +1,5 @@
-// "key=value,key=value" as in "testgen:size=1280x720,rate=25" and "scaler:kind=2".
+// "key=value,key=value" as in "testgen:size=1280x720,rate=25" and "scaler:kind=2". A backslash before a comma
+// or a backslash makes it a part of the value.
 #pragma once
 
 #include <string>

@@ -53,6 +53,7 @@ class Engine {
         AnyDict config;
         if (!log.empty()) config.set("logfile", log.c_str());
         init_wrapper(&config);
+        qv_registry()->addPlugin(qvSubtitlePlugin());
         pluginsLoaded_ = !plugins.empty();
         if (pluginsLoaded_ && qv_registry()->scanFolder(Any(plugins.c_str())) != QvStatus::ok)
             std::fprintf(stderr, "tarsel: warning: no plug-ins in %s\n", inQuotes(plugins).c_str());

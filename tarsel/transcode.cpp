@@ -7,14 +7,12 @@ namespace {
 // Options as they were given; they are parsed once the command runs.
 struct Given {
     JobOptions job;
-    std::string size, rate, pixel, samplerate, channels, bits, progress = "auto";
+    std::string samplerate, channels, bits, progress = "auto";
 };
 
 void resolve(Given& given) {
     JobOptions& job = given.job;
-    if (!given.size.empty()) job.size = parseSize(given.size, "--size");
-    if (!given.rate.empty()) job.rate = parseRate(given.rate, "--rate");
-    if (!given.pixel.empty()) job.pixel = parsePixel(given.pixel, "--pixel");
+    job.effects.check();
     if (!given.samplerate.empty())
         job.samplerate = static_cast<int>(parseNumber(given.samplerate, 1000, 768000, "--samplerate"));
     if (!given.channels.empty())
@@ -53,13 +51,9 @@ void addTranscode(CLI::App& app, Action& chosen, Signals& signals) {
     command->add_option("--from", job.from, "First instant taken: SS.mmm, HH:MM:SS, 120f, HH:MM:SS:FF")
         ->type_name("TIME");
     command->add_option("--to", job.to, "First instant not taken")->type_name("TIME");
-    command->add_option("--size", given->size, "Size of the picture")->type_name("WxH");
-    command->add_option("--rate", given->rate, "Frames a second: 25, 30000/1001, 25i")->type_name("RATE");
-    command->add_option("--pixel", given->pixel, "Pixel format, see 'tarsel formats'")->type_name("FOURCC");
     command->add_option("--samplerate", given->samplerate, "Samples a second")->type_name("N");
     command->add_option("--channels", given->channels, "Channels of the sound, 1 to 8")->type_name("N");
     command->add_option("--bits", given->bits, "Bits of a sample: 8, 16 or 24")->type_name("N");
-    command->add_option("--filter", job.filters, "A filter: NAME or NAME:key=value,...")->type_name("FILTER");
     command->add_option("--muxer", job.muxer, "nullmux: do everything but write")->type_name("NAME");
     command
         ->add_option(
@@ -74,6 +68,7 @@ void addTranscode(CLI::App& app, Action& chosen, Signals& signals) {
     command->add_flag("--dry-run", job.dryRun, "Print the plan and do nothing");
     command->add_flag("-y,--overwrite", job.overwrite, "Overwrite existing outputs");
     command->add_flag("-q,--quiet", job.quiet, "Say nothing but errors");
+    addEffectOptions(*command, job.effects);
     command->callback(
         [&chosen, &signals, given] { chosen = [&signals, given] { transcode(*given, signals); }; });
 }

@@ -87,6 +87,7 @@ constexpr QvParamRow<Settings> rows[] = {
     {"encodingRange", Access{nullptr, getEncodings}},
     {"framerate", Access{setFramerate, getFramerate}, qvParamStored},
     {"fontEffect", &Settings::fontEffect, qvParamStored, 0, Options::nrEffects - 1},
+    {"pixelAspect", &Settings::pixelAspect, qvParamStored, 0.1, 10},
     {"fontEffectRange", Access{nullptr, getEffects}},
     {"color", &Settings::color, qvParamStored, 0, 0xFFFFFF},
     {"colorR", Access{setByte<16>, getByte<16>}},
@@ -134,6 +135,7 @@ Options optionsOf(const Settings& settings, bool marked) {
     options.subEncoding = marked ? Options::utf8 : std::min<int>(settings.encoding, Options::byCodePage);
     options.codePage = settings.encoding >= Options::byCodePage ? settings.encoding : 0;
     options.fontEffect = settings.fontEffect;
+    options.pixelAspect = settings.pixelAspect;
     return options;
 }
 

@@ -12,6 +12,7 @@
 //     "framerate"          framerate  -        of the frame numbers in a "sub" file; the picture's if not set
 //     "fontEffect"         int        0        0 to 3
 //     "fontEffectRange"    list       -        read only: likewise, "No effect", "Outline", ...
+//     "pixelAspect"        double     1.0      width to height of the picture's pixels, 0.1 to 10
 //     "color"              int        white    0xRRGGBB
 //     "colorR", "colorG", "colorB"    255      its bytes
 //     "format"             int        0        read only: 1 SRT, 2 SUB, 0 while no file is loaded
@@ -36,6 +37,7 @@ struct SubtitleSettings {
     int encoding = 0;
     Any framerate;
     int fontEffect = 0;
+    double pixelAspect = 1;
     int color = 0xFFFFFF;
 };
 

@@ -53,6 +53,7 @@ constexpr QvParamRow<Settings> rows[] = {
     {"mode", QvParamAccess<Settings>{setMode, getMode}, qvParamStored},
     {"start", QvParamAccess<Settings>{setStart, getStart}, qvParamStored},
     {"startOffset", &Settings::startOffset, qvParamStored},
+    {"dropFrame", &Settings::dropFrame, qvParamStored, -1, 1},
     {"font_filename", &Settings::font, qvParamStored},
     overlay::byteRow("colorR", &Settings::red),
     overlay::byteRow("colorG", &Settings::green),
@@ -62,6 +63,11 @@ constexpr QvParamRow<Settings> rows[] = {
     {"renderingOptions", &Settings::renderingOptions, qvParamStored},
 };
 static_assert(qvParamTableOk<Settings>(rows));
+
+QvFramerate countingRate(QvFramerate rate, int dropFrame) {
+    if (dropFrame >= 0) rate.setDf(dropFrame == 1 && (rate.is29p() || rate.is59p() || rate.is59i()));
+    return rate;
+}
 
 // Of a number below 0, counted back from midnight.
 int wrapped(int number, const QvFramerate& rate) {
@@ -115,7 +121,8 @@ int TimecodeWriter::numberOf(const QvFrame& frame) {
 void TimecodeWriter::setText(const QvFrame& frame, int number) {
     char text[QvTimecode::textSize + 1];
     if (settings_.asTimecode) {
-        const QvTimecode timecode(wrapped(number, frame.framerate), frame.framerate, false);
+        const QvFramerate rate = countingRate(frame.framerate, settings_.dropFrame);
+        const QvTimecode timecode(wrapped(number, rate), rate, false);
         timecode.pprint(text, timecode.df());
         std::strcat(text, "*");
     } else {

@@ -5,6 +5,9 @@
 //     "start"             string         "FirstInputFrame"  that frame counts as 0; "InPoint": frames keep
 //                                                           the numbers that they come with
 //     "startOffset"       int            0                  subtracted from the number
+//     "dropFrame"         int            -1                 1: drop-frame timecode, 0: none, -1: as the
+//     frame's
+//                                                           rate says; 29.97 and 59.94 alone have it
 //     "font_filename"     path           the sans font      of all three faces
 //     "colorR", "colorG", "colorB"       255                0 to 255
 //     "positionX", "positionY"           -1                 pixels from the top left corner; an x of -1
@@ -12,7 +15,7 @@
 //     "renderingOptions"  dictionary     empty              a stored QvTextRenderingOptions; its fonts go
 //                                                           before "font_filename"
 //
-// A timecode is of the frame's own rate and drop-frame flag and ends with "*", on interlaced frames in the
+// A timecode is of the frame's own rate and ends with "*", on interlaced frames in the
 // upper field only. Below 0 it counts back from 24 hours, as tape does; a frame number is negative then.
 //
 // Unless the rendering options say so, the letters are h / 10 * 7 / 8 pixels high, at least 14, in a picture
@@ -28,6 +31,7 @@ struct TimecodeSettings {
     bool asTimecode = true;
     bool fromFirstFrame = true;
     int startOffset = 0;
+    int dropFrame = -1;
     std::string font;
     int red = 255, green = 255, blue = 255;
     int x = -1, y = -1;

@@ -1,4 +1,5 @@
 #include <algorithm>
+#include <cmath>
 #include <cstddef>
 #include <cstdlib>
 #include <cstring>
@@ -98,7 +99,7 @@ void FontLibrary::checkMemory() {
     if (std::exchange(ranOut_, false)) throw std::bad_alloc();
 }
 
-void FontFace::load(FontLibrary& library, const Any& file, int pixels) {
+void FontFace::load(FontLibrary& library, const Any& file, int pixels, double pixelAspect) {
     glyphs_.clear();
     shaper_.reset();
     face_.reset();
@@ -119,7 +120,8 @@ void FontFace::load(FontLibrary& library, const Any& file, int pixels) {
     if (FT_Select_Charmap(face, FT_ENCODING_UNICODE) != 0)
         qv_dbg()->info("Error: no unicode symbols in font file %s", name.c_str());
     const auto size = static_cast<FT_F26Dot6>(pixels) * 64;
-    const bool sized = pixels <= largestSize && FT_Set_Char_Size(face, 0, size, 0, 0) == 0;
+    const auto width = static_cast<FT_F26Dot6>(std::lround(static_cast<double>(size) / pixelAspect));
+    const bool sized = pixels <= largestSize && FT_Set_Char_Size(face, width, size, 0, 0) == 0;
     library.checkMemory();
     if (sized) return;
     qv_dbg()->info("Error setting char size to: %dpt 72dpi (default)", pixels);

@@ -120,7 +120,13 @@ struct QvSubtitleRender::Private {
         if (!library.get()) return;
         const Any* files[] = {&options.fontRegular, &options.fontItalic, &options.fontBold};
         for (std::size_t i = 0; i < faces.size(); ++i)
-            faces[i].load(library, files[i]->isText() ? *files[i] : options.fontRegular, options.charSize);
+            faces[i].load(library, files[i]->isText() ? *files[i] : options.fontRegular, options.charSize,
+                          aspectOf(options));
+    }
+
+    static double aspectOf(const Options& options) {
+        const bool usable = options.pixelAspect >= 0.1 && options.pixelAspect <= 10;
+        return usable ? options.pixelAspect : 1;
     }
 
     static int encodingOf(const Options& options) {

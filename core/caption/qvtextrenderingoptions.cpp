@@ -36,12 +36,14 @@ void QvTextRenderingOptions::store(AnyDict& dict) const {
     for (const auto& row : fontRows)
         if ((this->*row.field).isText()) dict.set(row.key, this->*row.field);
     for (const auto& row : numberRows) dict.set(row.key, Any(this->*row.field));
+    if (pixelAspect != 1) dict.set("pixelAspect", pixelAspect);
 }
 
 void QvTextRenderingOptions::restore(const AnyDict& dict) {
     for (const auto& row : fontRows)
         if (dict[row.key].isText()) this->*row.field = dict[row.key];
     for (const auto& row : numberRows) this->*row.field = dict.getInt32(row.key, this->*row.field);
+    pixelAspect = dict.getDouble("pixelAspect", pixelAspect);
 }
 
 const char* QvTextRenderingOptions::effectName(int effect) {

@@ -20,9 +20,12 @@ class QV_API QvTextRenderingOptions {
     int codePage = 0;           // with byCodePage
     int multibyteType = 0;      // kept for applications
     int fontEffect = noEffect;  // Effect
+    double pixelAspect = 1;     // width to height of the picture's pixels, 0.1 to 10: letters of a picture of
+                                // wide pixels are drawn narrow and come out right
 
     // Sets "fontdir_regular", "fontdir_italic", "fontdir_bold", "charSizePt", "subEncoding", "codePage",
-    // "multibyteType" and "fontEffect"; other keys stay. Fonts that are not set are left out.
+    // "multibyteType", "fontEffect" and, unless it is 1, "pixelAspect"; other keys stay. Fonts that are not
+    // set are left out.
     void store(AnyDict& dict) const;
     // Takes the keys that are there with the right type; the other fields keep their values.
     void restore(const AnyDict& dict);

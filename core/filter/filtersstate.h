@@ -3,6 +3,9 @@
 // `deinterlace`, `cropper` and `flipper` have a fixed place and stand under their own name; all other filters
 // stand in order in the vector "customFilters", each a dictionary with at least "name". "_on" is true in the
 // dictionary of an active filter; the rest is what the filter's store wrote.
+//
+// A dictionary "scaler" (with "_on") makes the automatic chain convert even between equal formats, and gives
+// its scaler the integers "inITU", "outITU" and "quality" that it holds.
 #pragma once
 
 #include "core/arch/api.h"

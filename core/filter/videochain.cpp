@@ -45,6 +45,7 @@ class VideoChain {
     void planScaler();
     void planRate();
     void planCustom();
+    void applyScalerState();
     void append(QvVProcessPipe& pipe, VideoFilterPtr filter) const;
 
     const VideoJobDescription& job_;
@@ -139,16 +140,25 @@ Matrix VideoChain::matrix() const {
 void VideoChain::planScaler() {
     const Matrix direction = matrix();
     if (width_ == job_.outWidth && height_ == job_.outHeight && job_.topBlankingLines == 0 &&
-        job_.inFOURCC == job_.outFOURCC && direction == Matrix::keep)
+        job_.inFOURCC == job_.outFOURCC && direction == Matrix::keep && !activeState("scaler"))
         return;
     scaler_ = qvchain::requireConverter("scaler", "scaler");
     scaler_->setParam("outWidth", job_.outWidth);
     scaler_->setParam("outHeight", job_.outHeight);
     scaler_->setParam("topBlankingLines", job_.topBlankingLines);
     scaler_->setParam("FOURCC", static_cast<int>(job_.outFOURCC));
-    if (direction == Matrix::keep) return;
-    scaler_->setParam("inITU", direction == Matrix::bt709To601 ? 2 : 1);
-    scaler_->setParam("outITU", direction == Matrix::bt709To601 ? 1 : 2);
+    if (direction != Matrix::keep) {
+        scaler_->setParam("inITU", direction == Matrix::bt709To601 ? 2 : 1);
+        scaler_->setParam("outITU", direction == Matrix::bt709To601 ? 1 : 2);
+    }
+    applyScalerState();
+}
+
+// What a user asks of the conversion goes before what follows from the sizes.
+void VideoChain::applyScalerState() {
+    const auto* state = activeState("scaler");
+    for (const char* name : {"inITU", "outITU", "quality"})
+        if (state && state->get(name).isInt32()) scaler_->setParam(name, state->get(name));
 }
 
 // A filter that makes two frames of each interlaced one does its part of the conversion.

@@ -123,7 +123,8 @@ TEST_F(Subtitle, LooksAsItsParametersSay) {
                                  {{"font_size", 20}},
                                  {{"fontEffect", 1}},
                                  {{"fontEffect", 2}},
-                                 {{"fontEffect", 3}}}) {
+                                 {{"fontEffect", 3}},
+                                 {{"pixelAspect", 2.0}}}) {
         all.push_back(at(30, params));
         for (std::size_t i = 0; i + 1 < all.size(); ++i) EXPECT_NE(all[i], all.back()) << params[0].name << i;
     }
@@ -176,6 +177,7 @@ TEST_F(Subtitle, IsAModuleOnceAnApplicationAddsIt) {
         {"encoding", 0, 1252, 99999},
         {"framerate", Any(), QvFramerate(QvRatio(24, 1)), 0},
         {"fontEffect", 0, 3, 4},
+        {"pixelAspect", 1.0, 1.5, 0.0},
         {"color", 0xFFFFFF, 0x102030, 0x1000000},
     };
     for (const auto& row : rows) {

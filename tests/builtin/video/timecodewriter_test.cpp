@@ -17,7 +17,8 @@
 
 namespace {
 
-const QvFramerate pal(QvRatio(25, 1)), palFields(QvRatio(25, 1), 1), drop(QvRatio(30000, 1001), 0, true);
+const QvFramerate pal(QvRatio(25, 1)), palFields(QvRatio(25, 1), 1), ntsc(QvRatio(30000, 1001)),
+    drop(QvRatio(30000, 1001), 0, true);
 
 struct Given {
     const char* name;
@@ -81,6 +82,9 @@ TEST_F(Timecode, CountsAsItsParametersSay) {
         {{{"start", "InPoint"}}, pal, 90061, "01:00:02:11*"},
         {{{"start", "InPoint"}}, drop, 1800, "00;01;00;02*"},
         {{{"start", "InPoint"}, {"startOffset", 25}}, pal, 50, "00:00:01:00*"},
+        {{{"start", "InPoint"}, {"dropFrame", 0}}, drop, 1800, "00:01:00:00*"},
+        {{{"start", "InPoint"}, {"dropFrame", 1}}, ntsc, 1800, "00;01;00;02*"},
+        {{{"start", "InPoint"}, {"dropFrame", 1}}, pal, 1500, "00:01:00:00*"},
         {{{"startOffset", -90000}}, pal, 7, "01:00:00:00*"},
         {{{"startOffset", 30}}, pal, 7, "23:59:58:20*"},
         {{{"startOffset", INT_MIN}, {"mode", 0}}, pal, 7, "2147483647"},
@@ -175,6 +179,7 @@ TEST_F(Timecode, ParametersAreCheckedStoredAndRestored) {
         {"mode", "Timecode", "Frame number", "frames"},
         {"start", "FirstInputFrame", "InPoint", 1},
         {"startOffset", 0, -5, "x"},
+        {"dropFrame", -1, 1, 2},
         {"font_filename", "", "/a.ttf", 1},
         {"colorR", 255, 1, 256},
         {"colorG", 255, 0, -1},

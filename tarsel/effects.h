@@ -1,0 +1,23 @@
+// What is to happen to a picture on its way: the options that `transcode` and `frame` share.
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include <CLI/CLI.hpp>
+
+// As they were given; empty when they were not.
+struct EffectOptions {
+    std::string size, rate, pixel, matrix;
+    std::string deinterlace, crop, fade, timecode, subtitles, subtitleStyle;
+    std::vector<std::string> logos, filters;
+    bool flip = false;
+
+    bool any() const;
+    // The first given option that needs a picture; --filter is not asked.
+    std::string given() const;
+    // Throws Failure for what is wrong with any input.
+    void check() const;
+};
+
+void addEffectOptions(CLI::App& command, EffectOptions& options);
