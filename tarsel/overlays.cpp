@@ -26,6 +26,7 @@ void checkFile(const std::string& name, const std::string& option) {
     if (!std::filesystem::exists(status))
         refuse(error && error != std::errc::no_such_file_or_directory ? inLine(error.message())
                                                                       : "no such file");
+    if (!std::filesystem::is_regular_file(status)) refuse("this is no regular file");
 }
 
 constexpr struct {

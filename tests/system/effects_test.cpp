@@ -237,6 +237,7 @@ TEST_F(Effects, WhatCanNotBeDoneIsTold) {
         {3, {"--logo", "gone.png@4,5"}, {"--logo", "'gone.png'", "no such file"}},
         {3, {"--logo", "bad.png@4,5"}, {"logo", "bad.png"}},
         {3, {"--subtitles", "gone\n.srt"}, {"--subtitles", "'gone\\x0a.srt'", "no such file"}},
+        {3, {"--subtitles", "/dev/null"}, {"'/dev/null'", "no regular file"}},
         {3, {"--subtitles", "dir.srt"}, {"'dir.srt'", "folder"}},
         {3, {"--subtitles", "bad.srt"}, {"bad.srt"}},
         {3, {"--subtitles", "l.png"}, {"l.png"}},
