@@ -35,13 +35,14 @@ TEST(AnyVector, positionsOutsideTheRange) {
     }
     vector.insert(4, 3);
     vector.insert(0, 0);
+    vector.set(1, "one");
     EXPECT_EQ(failureOf([&] { empty.front(); }), "");
     EXPECT_EQ(failureOf([&] { std::as_const(empty).back(); }), "");
     EXPECT_EQ(failureOf([&] { vector.resize(-1); }), "");
     EXPECT_TRUE(empty.popBack() == Any() && vector.popBack() == 4);
     vector.resize(2);
     vector.resize(4);
-    EXPECT_EQ(vector, AnyVector(0, 1, Any(), Any()));
+    EXPECT_EQ(vector, AnyVector(0, "one", Any(), Any()));
 }
 
 TEST(AnyVector, mayBeAddedToItselfAndCopiesAreDeep) {
