@@ -231,11 +231,16 @@ void PictureEffects::addOptions(FiltersState& state, long long frames, bool alon
         append(state, filter, filter.get("_front").isTrue());
     }
     for (const auto& logo : options_.logos) append(state, logoState(logo, out_), false);
+    // Text has to be drawn on other frames than those of I422.
+    const bool text = !options_.subtitles.empty() || !options_.timecode.empty();
+    const bool apart = text && frameFormat(out_.fourcc) == QvFourcc::I422;
+    if (apart) append(state, scalerState(out_.width, out_.height, QvFourcc::YUYV), false);
     if (!options_.subtitles.empty())
         append(state, subtitleState(options_.subtitles, options_.subtitleStyle, out_), false);
     if (!options_.fade.empty()) append(state, fadeState(options_.fade, out_, frames), false);
     if (!options_.timecode.empty())
         append(state, timecodeState(options_.timecode, out_, alone, !options_.subtitles.empty()), false);
+    if (apart) append(state, scalerState(out_.width, out_.height, QvFourcc::I422), false);
 }
 
 FiltersState PictureEffects::filters(long long frames, bool alone) const {

@@ -129,14 +129,14 @@ TEST_F(Effects, FieldsBecomeFrames) {
 
 TEST_F(Effects, FormatsThatNothingCanBeDrawnOn) {
     makeOverlays();
-    for (const char* pixel : {"v210", "Y216", "YUYV", "UYVY"}) {
+    for (const std::string pixel : {"v210", "Y216", "YUYV", "UYVY", "I422"}) {
         const Words job = {
-            "transcode", "testgen:size=96x64,duration=0.2,audio=0", "--pixel", pixel, "-y", "-o", "x.avi"};
+            "transcode", "testgen:size=96x64,duration=0.2,audio=0", "--pixel", pixel, "-y", "-o", "x.raw"};
         works(job);
-        const std::string plain = contents("x.avi");
+        const std::string plain = contents("x.raw");
         works(job + Words{"--logo", "l.png@8,8", "--subtitles", "x.srt"});
-        EXPECT_EQ(contents("x.avi").size(), plain.size());
-        EXPECT_FALSE(contents("x.avi") == plain) << pixel;
+        EXPECT_EQ(contents("x.raw").size(), plain.size());
+        EXPECT_FALSE(contents("x.raw") == plain) << pixel;
     }
 }
 
