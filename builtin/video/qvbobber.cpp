@@ -66,8 +66,6 @@ QvBobber::QvBobber() : VideoEffectOf("bobber", rows) {}
 void QvBobber::getParam(const char* name, Any& value) const {
     if (name && Any(name) == "_rateFactor")
         value = 2;
-    else if (name && Any(name) == "_isFramerateConverter")
-        value = 1;
     else
         VideoEffectOf::getParam(name, value);
 }

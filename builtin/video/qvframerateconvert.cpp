@@ -189,6 +189,7 @@ int QvFramerateConvert::writeInterlacing(const QvFrame& frame) {
     halfDone_ = !halfDone_;
     if (halfDone_) return beginWeave(output_, frame, first);
     if (const int status = endWeave(output_, frame, otherField(first))) return status;
+    if (first == Field::bottom) output_.copyMeta(frame);  // the top field's, as wherever fields are woven
     carried_.giveUserData(output_);
     carried_.giveCaptions(output_);
     output_.framerate = settings_.outRate;

@@ -8,12 +8,10 @@
 //   "inFramerate"            Framerate, or frames a second; getParam answers with frames a second. 25
 //   "outFramerate"           the same
 //   "interlace"              0 none, 1 top field first, 2 bottom field first: weaves if the input rate is
-//   twice
-//                            the output rate
+//                            twice the output rate
 //   "pulldown"               int as bool: 3:2 pulldown if the output rate is 5/4 of the input rate
-//   "_safeToApplyAfter"      read only: 1 if each output frame leaves once, so that a filter may work on it
-//   in
-//                            place
+//   "_safeToApplyAfter"      read only: 1 if each output frame leaves once, so that a filter may work on
+//                            it in place
 //   "_isFramerateConverter"  read only: 1
 //
 // With rates that don't suit them "interlace" and "pulldown" have no effect. Parameters before init, rates

@@ -17,7 +17,8 @@ std::unique_ptr<QvVideoFilter> newStage(const QvFramerate& in, const QvFramerate
 
 // Two progressive frames weave into one interlaced frame, so their rate has to be the field rate.
 qvchain::RateStages weave(const QvFramerate& in, const QvFramerate& out) {
-    const QvFramerate fieldRate(QvRatio(out.rate().num * 2, out.rate().den));
+    QvFramerate fieldRate = qvchain::scaledRate(out, 2, 1);
+    fieldRate.setInterlaced(0);
     qvchain::RateStages stages;
     stages.behindScaler = true;
     if (!QvNum::equ(in.rate(), fieldRate.rate(), QvRatio::tolerance)) stages.pre = newStage(in, fieldRate);

@@ -1,4 +1,5 @@
 // The video link: its streams, its frame range and its conversion.
+#include <algorithm>
 #include <string>
 
 #include "core/decode/qvdecoder.h"
@@ -187,13 +188,20 @@ int TransVLink::buildPipe() {
 // Filters that fade or count need to know how many frames they will see.
 void TransVLink::_setTotalVDuration() {
     if (!videoPipe_) return;
-    int total = nrFramesIn_;
-    for (int i = 0; i < videoPipe_->nrFilters(); ++i) {
+    const auto factor = [&](int i) {
+        return std::max(1, videoPipe_->filter(i)->getParam("_rateFactor").asInt32(1));
+    };
+    const int filters = videoPipe_->nrFilters();
+    long long total = nrFramesIn_, behind = 1;  // `behind`: frames that later filters make of one
+    for (int i = 0; i < filters; ++i) behind *= factor(i);
+    for (int i = 0; i < filters; ++i) {
         auto& filter = *videoPipe_->filter(i);
         if (filter.getParam("_isFramerateConverter").isTrue())
-            total = nrFramesOut_;
+            total = nrFramesOut_ / behind;
         else
-            qvSetOptionalParam(filter, "_totalFrames", total);
+            qvSetOptionalParam(filter, "_totalFrames", static_cast<int>(total));
+        total *= factor(i);
+        behind /= factor(i);
     }
 }
 

@@ -135,6 +135,7 @@ class FakeModule : public QvModule {
     QvCodec* create() override {
         auto filter = std::make_unique<Filter>(this);
         if (std::string(name()) == "frconvert") filter->known.set("_isFramerateConverter", 1);
+        if (std::string(name()) == "bobber") filter->known.set("_rateFactor", 2);
         return filter.release();
     }
 };

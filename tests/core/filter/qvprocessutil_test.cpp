@@ -1,73 +1,68 @@
 #include "core/filter/qvprocessutil.h"
 
-#include <gtest/gtest.h>
-
 #include <cstring>
 #include <memory>
 
 #include "builtin/modules.h"
 #include "core/encode/qvmuxer.h"
-#include "core/engine/qvexception.h"
 #include "core/media/qvbuffer.h"
 #include "core/media/qvgeometry.h"
 #include "core/stream/qvbufstrm.h"
+#include "tests/support/checks.h"
 #include "tests/support/fake_streams.h"
 
 namespace {
 
+using U = QvProcessUtil;
+using Rate = QvFramerate;
+
 TEST(RescaleTimePoints, KeepsTheTypeOfTheFirstElement) {
     AnyVector out(Any("old"));
-    QvProcessUtil::rescaleTimePoints({}, QvFramerate::f25p(), QvFramerate::f50p(), &out);
+    U::rescaleTimePoints({}, Rate::f25p(), Rate::f50p(), &out);
     EXPECT_EQ(out, AnyVector(Any("old")));
-    QvProcessUtil::rescaleTimePoints(AnyVector(0, 3, 1001), QvFramerate::f23p(), QvFramerate::f59p(), &out);
+    U::rescaleTimePoints(AnyVector(0, 3, 1001), Rate::f23p(), Rate::f59p(), &out);
     EXPECT_EQ(out, AnyVector(0, 7, 2502));
-    QvProcessUtil::rescaleTimePoints(AnyVector(Any(10LL), Any(4)), QvFramerate::f50p(), QvFramerate::f25p(),
-                                     &out);
+    U::rescaleTimePoints(AnyVector(Any(10LL), Any(4)), Rate::f50p(), Rate::f25p(), &out);
     EXPECT_EQ(out, AnyVector(Any(5LL), Any(2LL)));
-    QvProcessUtil::rescaleTimePoints(out, QvFramerate::f25p(), QvFramerate::f50p(), &out);
-    EXPECT_EQ(out, AnyVector(Any(10LL), Any(4LL)));
-    EXPECT_THROW(QvProcessUtil::rescaleTimePoints(out, QvFramerate(), QvFramerate(), nullptr),
-                 QvAssertFailure);
-    EXPECT_THROW(QvProcessUtil::rescaleTimePoints(AnyVector(Any(1.0)), QvFramerate(), QvFramerate(), &out),
-                 QvAssertFailure);
+    U::rescaleTimePoints(out, Rate::f25p(), Rate::f50p(), &out);
+    EXPECT_EQ(out, AnyVector(Any(10LL), Any(4LL))) << "in place";
+    EXPECT_THROW(U::rescaleTimePoints(out, Rate(), Rate(), nullptr), QvAssertFailure);
+    EXPECT_THROW(U::rescaleTimePoints(AnyVector(Any(1.0)), Rate(), Rate(), &out), QvAssertFailure);
 }
 
 TEST(SmartRenderDelays, AreRelativeToTheEarliestStream) {
-    NullMuxModule module;
-    std::unique_ptr<QvCodec> codec(module.create());
-    ASSERT_TRUE(codec);
-    codec->init();
+    const std::unique_ptr<QvCodec> codec(NullMuxModule().create());
     auto& muxer = dynamic_cast<QvMuxer&>(*codec);
-    AnyDict delays("old", 1);
-    QvProcessUtil::calculateSRAudioDelayCorrections(nullptr, delays);
-    EXPECT_TRUE(delays.empty());
-    ASSERT_TRUE(muxer.addStream(qvAudioStream, {}));
-    ASSERT_TRUE(muxer.addStream(qvAudioStream, {}));
+    muxer.init();
     FakeAudioEncoder first, second;
-    muxer.stream(qvAudioStream, 0)->setAtachee(&first);
-    muxer.stream(qvAudioStream, 1)->setAtachee(&second);
+    for (auto* encoder : {&first, &second}) {
+        ASSERT_TRUE(muxer.addStream(qvAudioStream, {}));
+        muxer.stream(qvAudioStream, encoder == &second)->setAtachee(encoder);
+    }
+    const auto delays = [&](QvMuxer* of) {
+        AnyDict delays("old", 1);
+        U::calculateSRAudioDelayCorrections(of, delays);
+        return delays;
+    };
+    const auto both = [](long long video, long long a, long long b) {
+        return AnyDict("video", AnyVector(Any(video)), "audio", AnyVector(Any(a), Any(b)));
+    };
+    EXPECT_TRUE(delays(nullptr).empty());
     first.params.set("smartRenderDelay", MediaTime(500));
-    QvProcessUtil::calculateSRAudioDelayCorrections(&muxer, delays);
-    EXPECT_TRUE(delays.empty()) << "without a video stream";
+    EXPECT_TRUE(delays(&muxer).empty()) << "without a video stream";
     ASSERT_TRUE(muxer.addStream(qvVideoStream, {}));
-    QvProcessUtil::calculateSRAudioDelayCorrections(&muxer, delays);
-    EXPECT_EQ(delays.get("video").asVector(), AnyVector(Any(500LL)));
-    EXPECT_EQ(delays.get("audio").asVector(), AnyVector(Any(0LL), Any(500LL)));
+    EXPECT_EQ(delays(&muxer), both(500, 0, 500));
     second.params.set("smartRenderDelay", MediaTime(-40));
-    QvProcessUtil::calculateSRAudioDelayCorrections(&muxer, delays);
-    EXPECT_EQ(delays.get("audio").asVector(), AnyVector(Any(0LL), Any(540LL)));
+    EXPECT_EQ(delays(&muxer), both(500, 0, 540));
     first.params.set("smartRenderDelay", 7);
     second.params.clear();
-    QvProcessUtil::calculateSRAudioDelayCorrections(&muxer, delays);
-    EXPECT_TRUE(delays.empty());
+    EXPECT_TRUE(delays(&muxer).empty());
 }
 
 TEST(YSwingCorrect, ChangesTheLumaOfY216Alone) {
-    EXPECT_EQ(YSwingCorrect::table8()[0], 16);
-    EXPECT_EQ(YSwingCorrect::table8()[255], 235);
-    EXPECT_EQ(YSwingCorrect::table8()[1], 17);
+    for (const auto& [in, out] : {std::pair{0, 16}, {1, 17}, {255, 235}})
+        EXPECT_EQ(YSwingCorrect::table8()[in], out);
     EXPECT_EQ(YSwingCorrect::table16()[0], 4096);
-    EXPECT_EQ(YSwingCorrect::table16()[65535], 60160);
     for (const unsigned fourcc : {QvFourcc::Y216, QvFourcc::b64a}) {
         QvFrame frame;
         ASSERT_EQ(frame.init(fourcc, 6, 3), 0);

@@ -39,7 +39,12 @@ AnyDict customFilters(const AnyVector& filters) { return AnyDict("customFilters"
 struct Job {
     explicit Job(int frames, const QvFramerate& in = f25, const QvFramerate& out = f25)
         : decoder(frames, in), encoder(out) {
-        plugin.video("frconvert").video("scaler").video("videofade").video("logo").add(new QvVfModule);
+        plugin.video("frconvert")
+            .video("scaler")
+            .video("videofade")
+            .video("bobber")
+            .video("logo")
+            .add(new QvVfModule);
     }
     int open() {
         if (const int result = link.init(&decoder, 0, &encoder, 0)) return result;
@@ -194,9 +199,11 @@ TEST(TransVLink, FiltersHearHowManyFramesTheyWillSee) {
     EXPECT_TRUE(log.contains("missing components"));
     Job job(50, f25, f50);
     job.encoder.video.params.set("width", 32);
-    const AnyDict early("name", "videofade", "_on", 1, "_front", 1);
-    const AnyDict late("name", "videofade", "_on", 1, "_front", 0);
-    job.params.set("effects", customFilters(AnyVector(Any(early), Any(late))));
+    const auto at = [](const char* name, int front, int position) {
+        return Any(AnyDict("name", name, "_on", 1, "_front", front, "_position", position));
+    };
+    const Any early = at("videofade", 1, 2), late = at("videofade", 0, 1);
+    job.params.set("effects", customFilters(AnyVector(early, late)));
     ASSERT_EQ(job.open(), 0);
     const auto total = [&](const char* name, int index) {
         return job.filter(name, index)->seen.getInt32("_totalFrames", -1);
@@ -207,6 +214,12 @@ TEST(TransVLink, FiltersHearHowManyFramesTheyWillSee) {
     EXPECT_EQ(total("videofade", 1), 100);
     job.link.log();
     EXPECT_TRUE(log.contains("1. videofade"));
+    // A bobber makes two frames of one, before them or behind.
+    job.link.close();
+    job.params.set("effects", customFilters(AnyVector(at("bobber", 1, 1), early, late, at("bobber", 0, 2))));
+    ASSERT_EQ(job.open(), 0);
+    EXPECT_EQ(total("videofade", 0), 100);
+    EXPECT_EQ(total("videofade", 1), 50);
 }
 
 TEST(TransVLink, ChoosesAFormatThatTheEncoderTakes) {

@@ -1,0 +1,182 @@
+// Jobs through automatic chains of the library's own filters.
+#include "builtin/decoders/sccdec.h"
+#include "core/caption/qvcc.h"
+#include "core/filter/filtersstate.h"
+#include "core/filter/jobdescription.h"
+#include "core/filter/qvfiltersetup.h"
+#include "core/filter/qvprocesspipe.h"
+#include "core/filter/qvprocessutil.h"
+#include "core/filter/userdatacallback.h"
+#include "core/transcode/translink.h"
+#include "tests/core/filter/chains.h"
+#include "tests/support/engine.h"
+#include "tests/support/temp_folder.h"
+
+namespace {
+
+using Rate = QvFramerate;
+
+// Keeps the words that the frames bring, and the time of the frame that brought each.
+class CaptionPipe : public FakeEncodePipe {
+  public:
+    using FakeEncodePipe::FakeEncodePipe;
+    int writeFrame(QvFrame* frame, int stream) override {
+        QvCcData captions;
+        EXPECT_TRUE(!frame || !frame->subpic() || captions.restore(*frame->subpic()) == 0);
+        for (const auto& pair : captions.pairs()) {
+            words.push_back(pair.byte1 << 8 | pair.byte2);
+            times.push_back(
+                MediaTime(frame->frameNr, frame->framerate, MediaTime::defaultTimescale).seconds());
+        }
+        return FakeEncodePipe::writeFrame(frame, stream);
+    }
+    std::vector<int> words;
+    std::vector<double> times;
+};
+
+class ChainJobs : public testing::Test {
+  protected:
+    // Words at the frames 10, 17, 24, ... of 29.97.
+    void openCaptions(SccDec& captions) const {
+        std::string lines = "Scenarist_SCC V1.0\n\n";
+        for (int i = 0; i < wordCount; ++i)
+            lines +=
+                Any::sprintf("00:00:%02d:%02d\t%04x\n\n", frameOf(i) / 30, frameOf(i) % 30, firstWord + i)
+                    .asString();
+        captions.init();
+        captions.setParam("filename", folder.write("a.scc", lines).c_str());
+        ASSERT_EQ(captions.open(), 0);
+    }
+    static std::unique_ptr<QvVProcessPipe> pipeOf(const VideoJobDescription& job, const char* plan) {
+        std::unique_ptr<QvVProcessPipe> pipe(QvProcessUtil::createVideoPipe(job));
+        EXPECT_EQ(planOf(pipe, [](auto&) { return ""; }), plan);
+        return pipe;
+    }
+    static VideoJobDescription job(unsigned fourcc, const Rate& in, int outWidth, int outHeight,
+                                   const Rate& out) {
+        VideoJobDescription job;
+        job.inWidth = 64, job.inHeight = 48, job.inFramerate = in;
+        job.outWidth = outWidth, job.outHeight = outHeight, job.outFramerate = out;
+        job.inFOURCC = job.outFOURCC = fourcc;
+        return job;
+    }
+
+    static constexpr int wordCount = 15, firstWord = 0x9420;
+    static int frameOf(int word) { return 10 + 7 * word; }
+    const EngineScope engine;
+    TempFolder folder;
+};
+
+void countFrames(void* context, QvFrame&) { ++*static_cast<int*>(context); }
+
+}  // namespace
+
+TEST_F(ChainJobs, CaptionsArriveOnceInOrderAndInTime) {
+    const Rate i59 = Rate::f59i(), i59Bottom(i59.rate(), 2);
+    const struct {
+        Rate in, out;
+        const char* filter;
+        int converters;
+    } rows[] = {
+        {Rate::f59p(), Rate::f29p(), "", 1}, {Rate::f29p(), Rate::f59p(), "", 1}, {Rate::f59p(), i59, "", 1},
+        {Rate::f60p(), i59Bottom, "", 2},    {Rate::f23p(), i59, "", 1},          {Rate::f24p(), i59, "", 2},
+        {Rate::f50p(), Rate::f24p(), "", 1}, {i59, Rate::f59p(), "bobber", 0},
+    };
+    for (const auto& row : rows) {
+        const double in = row.in.rate().ratio(), out = row.out.rate().ratio();
+        SCOPED_TRACE(testing::Message() << in << " to " << out);
+        SccDec captions;
+        openCaptions(captions);
+        FakeDecoder decoder(static_cast<int>(4 * in), row.in);
+        CaptionPipe pipe(row.out);
+        TransVLink link;
+        AnyDict params;
+        if (*row.filter) params.set("effects", AnyDict("customFilters", AnyVector(Any(stored(row.filter)))));
+        ASSERT_EQ(link.init(&decoder, 0, &pipe, 0), 0);
+        ASSERT_EQ(link.addMetaSource(&captions, 4, 0, {}), 0);
+        ASSERT_EQ(link.open(&params), 0);
+        EXPECT_EQ(link.filter("frconvert", row.converters), nullptr);
+        EXPECT_TRUE(row.converters == 0 || link.filter("frconvert", row.converters - 1));
+        while (!link.finished()) ASSERT_EQ(link.processFrame(0), 0);
+
+        ASSERT_EQ(pipe.words.size(), std::size_t{wordCount});
+        for (std::size_t i = 0; i < wordCount; ++i) {
+            EXPECT_EQ(pipe.words[i], firstWord + static_cast<int>(i));
+            EXPECT_NEAR(pipe.times[i], frameOf(static_cast<int>(i)) * 1001 / 30000.0, 1 / in + 1 / out) << i;
+        }
+        const std::vector<int>& numbers = pipe.video.numbers;
+        EXPECT_EQ(numbers.size(), static_cast<std::size_t>(link.totalOutFrames()));
+        for (std::size_t i = 0; i < numbers.size(); ++i) ASSERT_EQ(numbers[i], static_cast<int>(i));
+    }
+}
+
+TEST_F(ChainJobs, TheBobbersShareOfTheRateIsCounted) {
+    const struct {
+        Rate out;
+        int front, outHeight;
+        const char* chain;
+    } rows[] = {
+        {Rate::f50p(), 1, 48, "bobber"},
+        {Rate::f50p(), 0, 48, "bobber"},
+        // No field is dropped, though half the lines would do.
+        {Rate::f50p(), 1, 24, "bobber scaler"},
+        {Rate::f50p(), 0, 24, "scaler bobber"},
+        {Rate::f25p(), 1, 24, "bobber frconvert scaler"},
+        {Rate::f59p(), 1, 24, "bobber scaler frconvert"},
+        {Rate::f25p(), 0, 48, "frconvert bobber"},
+    };
+    for (const auto& row : rows) {
+        auto bobbed = job(QvFourcc::I420, Rate::f50i(), 64, row.outHeight, row.out);
+        bobbed.filters.set("customFilters", AnyVector(Any(stored("bobber", AnyDict("_front", row.front)))));
+        const auto pipe = pipeOf(bobbed, row.chain);
+        int written = 0;
+        QvFrame frame;
+        frame.init(QvFourcc::I420, 64, 48);
+        frame.setBlack();
+        frame.framerate = Rate::f50i();
+        for (frame.frameNr = 0; frame.frameNr < 50; ++frame.frameNr) {
+            EXPECT_EQ(pipe->write(frame), 0);
+            for (; pipe->process(nullptr, 0) == 0; pipe->next()) {
+                EXPECT_EQ(pipe->frame()->frameNr, written++);
+                EXPECT_TRUE(pipe->frame()->framerate == row.out);
+            }
+        }
+        EXPECT_NEAR(written, 2 * row.out.rate().ratio(), 1) << row.chain;
+    }
+}
+
+TEST_F(ChainJobs, FiltersOfASetUpDoTheirWork) {
+    int seen = 0;
+    QvVFilterSetup setup;
+    setup.addFilter("videofade", false);
+    setup.addUserDataCallback(reinterpret_cast<const void*>(&countFrames), &seen, true);
+    setup.setFlip(true);
+    setup.setDeinterlace(QV_DEINTERLACE_BOTTOM);
+    setup.setCrop(1, 64, 48, QvRect(8, 4, 56, 44), 2, 2, 4, 4);
+    FiltersState state;
+    setup.store(state);
+    auto described = job(QvFourcc::GRAY, Rate::f50i(), 56, 22, Rate::f25p());
+    described.filters = state;
+    const auto pipe = pipeOf(described, "userdata flipper cropper deinterlace videofade");
+    QvFrame in, black;
+    in.init(QvFourcc::GRAY, 64, 48);
+    black.init(QvFourcc::GRAY, 2, 2);
+    black.setBlack();
+    for (int y = 0; y < 48; ++y)
+        for (int x = 0; x < 64; ++x) *in.pixelPtr(x, y) = static_cast<unsigned char>(2 * y + x);
+    in.framerate = Rate::f50i();
+    in.frameNr = 0;
+    EXPECT_EQ(pipe->write(in), 0);
+    ASSERT_EQ(pipe->process(nullptr, 0), 0);
+    const QvFrame& out = *pipe->frame();
+    ASSERT_EQ(out.width() * 100 + out.height(), 5622);
+    EXPECT_EQ(out.framerate.interlaced(), 0);
+    for (int y = 0; y < 22; ++y)
+        for (int x = 0; x < 56; ++x) {
+            // Row y shows row 2 y + 1 of the padded box, which shows row 45 - (2 y + 1) of the input.
+            const bool isPad = y == 0 || y == 21 || x < 4 || x >= 52;
+            ASSERT_EQ(*out.pixelPtr(x, y), isPad ? *black.plane() : 2 * (44 - 2 * y) + x + 4)
+                << x << " " << y;
+        }
+    EXPECT_EQ(seen, 1);
+}
