@@ -6,14 +6,6 @@
 
 namespace {
 
-TEST(Codepages, NamesOfKnownAndUnknownNumbers) {
-    EXPECT_STREQ(codepage_name(20000).description, "CNS Taiwan; Chinese Traditional (CNS)");
-    EXPECT_STREQ(codepage_name(37).name, "IBM037");
-    EXPECT_STREQ(codepage_name(65001).name, "utf-8");
-    for (const int number : {-1, 0, 36, 28602, 65002})
-        EXPECT_EQ(std::string(codepage_name(number).description) + codepage_name(number).name, "") << number;
-}
-
 TEST(Codepages, WhatIsOfferedCanBeConvertedAndHasAName) {
     AnyVector list("left over");
     EXPECT_EQ(available_codepages(list), 0);

@@ -60,14 +60,6 @@ TEST_F(Listing, ManyStarsDoNotTakeForEver) {
     EXPECT_EQ(matching(pattern.c_str()).size(), 1u);
 }
 
-TEST_F(Listing, PlugInsAreFilesByTheirEnding) {
-    files({"one_plugin.so", "two_plugin.so", "plugin.so", "three_plugin.so.1"});
-    fs::create_directory(temp.file("dir_plugin.so"));
-    AnyVector list;
-    get_folder_plugin_dlls(narrow(folder), &list);
-    EXPECT_EQ(names(list), (Texts{"one_plugin.so", "two_plugin.so"}));
-}
-
 TEST_F(Listing, LeavesOutDotsAndOnWishFolders) {
     files({"b", "a.x", ".hidden", ".h.x", "..x"});
     fs::create_directory(temp.file("sub"));
@@ -86,18 +78,6 @@ TEST_F(Listing, WideListingsLoseNoFile) {
     EXPECT_TRUE(fs::is_empty(folder));
 }
 
-TEST_F(Listing, MissesAreLinesInTheLog) {
-    LogCapture log;
-    const std::string absent = temp.file("absent");
-    AnyVector list;
-    for (const Any& name : {narrow(absent), wide(absent), narrow(folder), wide(folder)})
-        get_folder_files_by_ext(name, ".x", &list);
-    EXPECT_EQ(log.texts(), (Texts{"get_folder_files_by_extA - invalid folder: " + absent,
-                                  "get_folder_files_by_extW - Invalid (w)folder: " + absent,
-                                  "get_folder_files_by_extA - no files found: *.x",
-                                  "get_folder_files_by_extW - no files found: *.x"}));
-}
-
 TEST_F(Listing, SequencesHaveOneLengthPrefixAndExtension) {
     files({"a001.png", "a002.png", "a10.png", "a003.PNG", "b004.png", "a005.jpg", "a0010.png", "p10", "p00",
            "p09", "p11", "7", "3", "x", "q00000000000001", "q99999999999999", "q00000000000002"});
@@ -109,11 +89,6 @@ TEST_F(Listing, SequencesHaveOneLengthPrefixAndExtension) {
     EXPECT_EQ(sequence("p10"), (Numbers{2, 0, 9, 10, 11}));
     EXPECT_EQ(sequence("7"), (Numbers{1, 3, 7}));
     EXPECT_EQ(sequence("q00000000000001"), (Numbers{14, 1, 2}));
-    EXPECT_EQ(QvFile::numberedSequence(Any(5), nullptr).size(), 0);
-    const fs::path before = fs::current_path();
-    fs::current_path(folder);
-    EXPECT_EQ(QvFile::numberedSequence("p10", nullptr).size(), 4);  // in the current folder
-    fs::current_path(before);
 }
 
 TEST_F(Listing, RemovalTakesWhatIsListedAndReportsWhatIsLeft) {

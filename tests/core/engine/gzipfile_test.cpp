@@ -63,9 +63,6 @@ TEST_F(GzipFile, WhatIsNoGzipFileIsRefused) {
     Any out;
     EXPECT_EQ(QvFile::decompress(Any(temp.path().c_str()), out), -1);
     EXPECT_EQ(QvFile::decompress(5, out), -1);
-    EXPECT_EQ(QvFile::compress(name, nullptr, 5), -1);
-    EXPECT_EQ(QvFile::compress(name, nullptr, -1), -1);
-    EXPECT_EQ(QvFile::compress(narrow(temp.file("no/folder")), nullptr, 0), -1);
 }
 
 TEST_F(GzipFile, AFullDiscIsAFailureEvenWhenOnlyClosingMeetsIt) {

@@ -20,8 +20,6 @@ TEST(ParamTrace, EveryTypeHasItsForm) {
         {Any(u"wide \u00E9"), "v [WString]     wide \u00E9"},
         {Any(reinterpret_cast<const void*>(std::uintptr_t{0xAB12})), "v [Generic]     = 0x000000000000AB12"},
         {Any(QvPoint(1, -2)), "v [Point]       = (1, -2)"},
-        {Any(Pair(3, 4)), "v [Pair]        = (3, 4)"},
-        {Any(QvRect(1, 2, 3, 4)), "v [Rect]        = (value)"},
         {Any(MediaTime(1500LL, 1000)), "v [MediaTime]   = 1.500000s"},
     };
     LogCapture log;
@@ -31,13 +29,6 @@ TEST(ParamTrace, EveryTypeHasItsForm) {
         EXPECT_EQ(log.texts(), Texts{c.line});
         EXPECT_EQ(log.lines()[0].mask, QvLogMask::debug);
     }
-    log.clear();
-    const QvFramerate rate(25.0);
-    const QvBitrate bits(QvBitrate::cbr, 1000000);
-    QvUtil::debugOutAny("r", rate, 0, 0);
-    QvUtil::debugOutAny("b", bits, 0, 0);
-    EXPECT_EQ(log.texts(), (Texts{std::string("r [Framerate] = ") + rate.desc(true, true).asString(),
-                                  std::string("b [Bitrate] = ") + bits.desc().asString()}));
 }
 
 TEST(ParamTrace, NumbersIgnoreTheLocale) {
@@ -47,25 +38,6 @@ TEST(ParamTrace, NumbersIgnoreTheLocale) {
     QvUtil::debugOutAny("v", Any(1.5), 0, 0);
     qv_dbg()->info("%.2f", 0.25);
     EXPECT_EQ(log.texts(), (Texts{"v [Float] = 1.500000", "0.25"}));
-}
-
-TEST(ParamTrace, ContainersFollowOneLevelDeeper) {
-    const AnyDict inner("x", 1, "y", AnyVector(Any("a"), Any(2)));
-    LogCapture log;
-    QvUtil::debugOutAny("top", inner, 1, 20);
-    EXPECT_EQ(log.texts(), (Texts{
-                               "  top [Dict] ",
-                               "    x [Int32]       = 1",
-                               "    y [Vector] ",
-                               "      0 [String]    a",
-                               "      1 [Int32]     = 2",
-                           }));
-    log.clear();
-    QvUtil::debugOutAny("top", inner, 0, 20, false);
-    EXPECT_EQ(log.texts(), Texts{"top [Dict] "});
-    log.clear();
-    QvUtil::debugOutDict(AnyDict("k", 1.0));
-    EXPECT_EQ(log.texts(), Texts{"k [Float]                               = 1.000000"});
 }
 
 }  // namespace

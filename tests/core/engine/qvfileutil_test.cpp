@@ -1,11 +1,7 @@
 #include "core/engine/qvfileutil.h"
 
-#include <fcntl.h>
 #include <sys/stat.h>
 
-#include <ctime>
-
-#include "core/media/datetime.h"
 #include "tests/support/checks.h"
 
 namespace {
@@ -71,42 +67,12 @@ TEST_P(FileUtil, MovingLosesNothing) {
     EXPECT_EQ(TempFolder::read(temp.file("folder/inside")), "new");
 }
 
-TEST_P(FileUtil, ModificationIsLocalTimeToTheMicrosecond) {
-    temp.write("f", "");
-    const timespec times[2] = {{0, UTIME_OMIT}, {1'600'000'000, 123'456'789}};
-    ASSERT_EQ(utimensat(AT_FDCWD, temp.file("f").c_str(), times, 0), 0);
-    const std::time_t seconds = times[1].tv_sec;
-    const std::tm* const local = std::localtime(&seconds);
-    const QvDateTime expected(QvDate(local->tm_mday, local->tm_mon + 1, local->tm_year + 1900),
-                              QvTime(local->tm_hour, local->tm_min, local->tm_sec, 123, 456));
-    EXPECT_EQ(QvFile::lastModified(name("f")), expected);
-    EXPECT_EQ(QvFile::lastModified(name("absent")), QvDateTime());
-}
-
-TEST(FileUtilPlain, WhatIsNoTextFailsQuietly) {
-    EXPECT_FALSE(QvFile::isFile(Any()) || QvFile::isDir(5));
-    const long long results[] = {QvFile::flength(Any(5)),  QvFile::rm(5),
-                                 QvFile::mkdir(Any()),     QvFile::rmdir(Any("")),
-                                 QvFile::mv("a", 5, true), execute_process(Any()),
-                                 QvFile::freeSpace(Any()), QvFile::flength(static_cast<void*>(nullptr))};
-    for (const long long result : results) EXPECT_EQ(result, -1) << &result - results;
-    EXPECT_EQ(QvFile::ls(5, 0).size(), 0);
-}
-
 TEST(FileUtilPlain, CommandsTakeQuotedNamesOfBothWidths) {
     const TempFolder temp;
     const Any file = wide(temp.file("it's; exit 9"));
     EXPECT_EQ(execute_process(Any::strcat("touch ", QvFile::shellQuote(file))), 0);
     EXPECT_TRUE(QvFile::isFile(file));
     EXPECT_EQ(execute_process("exit 7"), 7);
-}
-
-TEST(FileUtilPlain, PlacesAreThePlatformsAnswer) {
-    EXPECT_EQ(qv_os_name(QvFile::tempDir()).back(), '/');
-    EXPECT_TRUE(QvFile::isAbsolutePath(core_library_path()) && QvFile::isFile(core_library_path()));
-    FullDisc disc(77);
-    const PlatformScope scope(disc);
-    EXPECT_EQ(QvFile::freeSpace("/tmp/x"), 77);
 }
 
 }  // namespace

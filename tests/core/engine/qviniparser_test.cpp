@@ -43,12 +43,9 @@ TEST_F(Ini, EachFaultHasItsMessageAndStatus) {
         Texts messages;
     } cases[] = {
         {"a", 0, {"line 1: line too short"}},
-        {"[s]\nab", 0, {"line 2: line too short"}},
         {"[s]\na=", -15, {"line 2: value too short"}},
-        {"[s]\n = b", -15, {"line 2: key too short"}},
         {"[s]\nabc", -15, {"line 2: can't parse line"}},
         {"k=v", -15, {"line 1: data outside section"}},
-        {"[s", -15, {"line 1: unterminated or empty section"}},
         {"[]x=y", -15, {"line 1: unterminated or empty section"}},
         {std::string("[s]\nk=a\0b", 9), -15, {"line 2: can't parse line"}},
         {"[s]\nabc\nk=v\na", -15, {"line 2: can't parse line", "line 4: line too short"}},
@@ -59,12 +56,6 @@ TEST_F(Ini, EachFaultHasItsMessageAndStatus) {
         EXPECT_EQ(load(c.text), c.status) << c.text;
         EXPECT_EQ(errors, c.messages) << c.text;
     }
-}
-
-TEST_F(Ini, FaultsDoNotStopTheReading) {
-    EXPECT_EQ(load("lost=1\n[s]\nk=v\n[\nl=w\n???\n[t]\nm=x\n"), -15);
-    EXPECT_EQ(errors.size(), 3u);
-    EXPECT_EQ(value("s", "k") + value("s", "l") + value("t", "m"), "vwx");
 }
 
 TEST_F(Ini, RepeatedSectionsAndKeysAnswerWithTheFirst) {
@@ -78,7 +69,6 @@ TEST_F(Ini, RepeatedSectionsAndKeysAnswerWithTheFirst) {
 }
 
 TEST_F(Ini, NumbersAreWholeOrTheDefaultWithAMessage) {
-    LogCapture log;
     load(
         "[n]\ni=-42\np=+7\nbig=3000000000\nhuge=99999999999999999999\nf=2.5e3\ntext=abc\ntail=12abc\nsign=+-"
         "1\n");
@@ -89,8 +79,6 @@ TEST_F(Ini, NumbersAreWholeOrTheDefaultWithAMessage) {
     for (const char* bad : {"big", "tail", "sign"}) EXPECT_EQ(ini.getInt32Value("n", bad, 1), 1) << bad;
     EXPECT_TRUE(ini.getInt64Value("n", "huge", 3) == 3 && ini.getFloatValue("n", "text", 4) == 4);
     EXPECT_EQ(ini.errors().size(), 5);
-    for (const char* type : {"int", "int64_t", "double"})
-        EXPECT_TRUE(log.contains("Couldn't read " + std::string(type) + " value")) << type;
 }
 
 TEST_F(Ini, LongLinesKeepTheirStartAndSaySo) {

@@ -97,14 +97,6 @@ TEST_F(DbgLog, EnvironmentOverridesUnlessItBeginsWithZero) {
     qv_dbg()->info("to the standard error");
     EXPECT_THAT(testing::internal::GetCapturedStderr(), HasSubstr("to the standard error"));
     EXPECT_FALSE(std::filesystem::exists(folder_.file("unused")));
-    for (const char* off : {"0", "0stderr", ""}) {
-        ::setenv("QVTARSEL_DEBUG", off, 1);
-        testing::internal::CaptureStdout();
-        open("stdout");
-        qv_dbg()->info("to the standard output");
-        EXPECT_THAT(testing::internal::GetCapturedStdout(), HasSubstr("to the standard output"));
-        qv_dbg()->init(nullptr, nullptr);
-    }
 }
 
 TEST_F(DbgLog, LoggerThatThrowsLeavesTheLogUsable) {
@@ -172,29 +164,6 @@ TEST(LogBuffer, HoldsOneMoreThanItsMaximumAndCountsAll) {
     EXPECT_TRUE(buffer.getWriteCntr() == start + 2 && buffer.nrMessages() == 0);
 }
 
-TEST(LogBuffer, LevelsOfItsOperations) {
-    QvLogBuffer buffer;
-    buffer.log(1, "m");
-    buffer.error("m");
-    buffer.warning("m");
-    buffer.info("m");
-    buffer.header("m");
-    buffer.progress("m");
-    buffer.fappend("m");
-    buffer.append("m", 4);
-    buffer.append(Any(u"m"), 2);
-    buffer.append(Any(1), 2);
-    AnyVector all;
-    buffer.getAll(all);
-    std::vector<int> masks;
-    for (const Any& message : all) masks.push_back(message.asDict().getInt32("type"));
-    EXPECT_EQ(masks, (std::vector{1, 2, 4, 8, 16, 64, 8, 4, 2}));
-    EXPECT_EQ(textsOf(all), Texts(9, "m"));
-    EXPECT_TRUE(buffer.nrErrors() == 2 && buffer.nrWarnings() == 2);
-    buffer.clearStatus();
-    EXPECT_TRUE(buffer.nrErrors() + buffer.nrWarnings() == 0 && buffer.nrMessages() == 9);
-}
-
 TEST(LogBuffer, PollerGetsWhatIsNewAndAtLeastTheLast) {
     QvLogBuffer buffer;
     AnyVector out(Any(1));
@@ -209,19 +178,6 @@ TEST(LogBuffer, PollerGetsWhatIsNewAndAtLeastTheLast) {
         EXPECT_EQ(buffer.getSince(out, c.last), 3);
         EXPECT_EQ(textsOf(out), c.texts) << c.last;
     }
-}
-
-TEST(LogBuffer, CopyFileTakesMessagesUntilItIsClosed) {
-    const TempFolder folder;
-    QvLogBuffer buffer;
-    EXPECT_EQ(buffer.setLogFile(Any(folder.file("missing/x").c_str())), -1);
-    EXPECT_EQ(buffer.setLogFile(Any(folder.file("copy").c_str())), 0);
-    buffer.error("100%%");
-    buffer.append("50% of %s", 8);
-    EXPECT_EQ(buffer.setLogFile(Any()), -1);
-    buffer.info("later");
-    EXPECT_THROW(buffer.setLogFile(Any(1)), QvAssertFailure);
-    EXPECT_EQ(TempFolder::read(folder.file("copy")), "100%\n50% of %s\n");
 }
 
 TEST(LogBuffer, PercentSignsReachTheDebugLogWithoutHarm) {

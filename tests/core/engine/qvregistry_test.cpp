@@ -1,7 +1,6 @@
 #include "core/engine/qvregistry.h"
 
 #include <memory>
-#include <set>
 
 #include "core/engine/init.h"
 #include "core/engine/qvcodec.h"
@@ -76,14 +75,8 @@ class Registry : public testing::Test {
 
 TEST_F(Registry, AddsAPlugin) {
     add(2, "one");
-    LogCapture log;
     EXPECT_EQ(registry.addPlugin(&plugin), 0);
-    EXPECT_TRUE(
-        log.contains("[Registry] Added Modules of a test (2.5.10.7839 2011-10-12), containing 1 module(s)",
-                     QvLogMask::debug));
     EXPECT_EQ(registry.nrPlugins(), 1);
-    EXPECT_TRUE(registry.plugin(0) == &plugin && registry.plugin("tests") == &plugin);
-    EXPECT_EQ(plugin.getAttr("filename"), "builtin");
     EXPECT_EQ(registry.module("one")->plugin(), &plugin);
     for (int outside : {-1, 1, 2147483647})
         EXPECT_TRUE(!registry.plugin(outside) && !registry.module(outside) && !plugin.module(outside));
@@ -154,20 +147,6 @@ TEST_F(Registry, DecodersComeBestFirst) {
     EXPECT_FALSE(registry.isModuleEnabled("off") || registry.isModuleEnabled("absent"));
 }
 
-TEST_F(Registry, ExtensionsAsPatterns) {
-    add(2, "a", AnyDict("exts", exts("wav", "*")));
-    add(2, "b", AnyDict("exts", exts("wav", "WAV")));
-    add(2, "off", AnyDict("exts", exts("off"), "disabled", 1));
-    add(2, "c", AnyDict("exts", AnyVector(Any(1), Any(u"mxf"))));
-    add(10, "mux", AnyDict("exts", exts("mux")));
-    registry.addPlugin(&plugin);
-    const char* patterns[] = {"wav WAV mxf", "*wav *WAV *mxf", ".wav .WAV .mxf", "*.wav *.WAV *.mxf"};
-    for (int i = 0; i < 4; ++i) {
-        const std::unique_ptr<AnyVector> found(registry.inputExts(i / 2 == 1, i % 2 == 1));
-        EXPECT_EQ(found->join(" ").toString(), patterns[i]);
-    }
-}
-
 TEST_F(Registry, OverridesGoOutAndIn) {
     QvModule* a = add(2, "a", AnyDict("priority", 10));
     QvModule* b = add(2, "b", AnyDict("priority", 10));
@@ -182,82 +161,10 @@ TEST_F(Registry, OverridesGoOutAndIn) {
     EXPECT_TRUE(registry.isOverriden(a) && !registry.isOverriden(b));
     a->setAttr("priority", 10);
 
-    LogCapture log;
     overrides.set("absent", AnyDict());
     overrides.set("b", 7);
     registry.setModuleOverrides(overrides);
     EXPECT_TRUE(a->getAttr("priority") == 5 && b->getAttr("priority") == 10);
-    EXPECT_TRUE(
-        log.contains("Found overrides for module absent, but it is not loaded, skipping.", QvLogMask::debug));
-    EXPECT_TRUE(log.contains("Found overrides for module b, error in format, skipping.", QvLogMask::error));
-}
-
-TEST_F(Registry, ConfigurationDecidesFolders) {
-    const TempFolder folder;
-    const std::string settings = folder.file("settings");
-    LogCapture log;
-    registry.setConfig(AnyDict("temp_dir", "/elsewhere", "userSettingsDir", settings.c_str()));
-    EXPECT_TRUE(log.contains("[Registry] configuration set to:", QvLogMask::debug));
-    EXPECT_EQ(registry.tempDir(), "/elsewhere");
-    EXPECT_EQ(registry.userSettingsDir(true), settings.c_str());
-    EXPECT_FALSE(std::filesystem::exists(settings));
-    EXPECT_EQ(registry.userSettingsDir(false), settings.c_str());
-    EXPECT_TRUE(std::filesystem::is_directory(settings));
-    registry.setConfig(AnyDict());
-    EXPECT_EQ(registry.tempDir(), QvFile::tempDir());
-    EXPECT_EQ(registry.userSettingsDir(true), QvFile::joinPath(QvFile::homeDir(), ".QVTarselSdk"));
-    const struct {
-        const char* given;
-        bool absolute;
-    } cases[] = {{"c:\\x", true}, {"\\\\server", true}, {"c:", false}, {"\\\\", false}, {"a/b", false}};
-    for (const auto& c : cases) {
-        registry.setConfig(AnyDict("userSettingsDir", c.given));
-        EXPECT_EQ(registry.userSettingsDir(true) == c.given, c.absolute) << c.given;
-    }
-}
-
-TEST_F(Registry, OptionsAreApartFromTheConfiguration) {
-    registry.setDbgOption("log_progress", 1);
-    EXPECT_TRUE(registry.getDbgOption("log_progress") == 1 && registry.config().empty());
-    registry.setConfig(AnyDict("disable_exceptions", 0));
-    EXPECT_TRUE(registry.throwParamException());
-    registry.setConfig(AnyDict("disable_exceptions", "yes"));
-    EXPECT_FALSE(registry.throwParamException());
-}
-
-TEST_F(Registry, ExternalIoIsCopiedAndNeedsItsFourthWord) {
-    QvExternalIO io;
-    io.words[0] = &io;
-    registry.setExternalDecoderIO(&io);
-    EXPECT_EQ(registry.externalDecoderIO(), nullptr);
-    io.words[3] = &io;
-    EXPECT_EQ(registry.externalDecoderIO(), nullptr);
-    registry.setExternalDecoderIO(&io);
-    EXPECT_EQ(registry.externalDecoderIO()->words[0], &io);
-    registry.setExternalDecoderIO(nullptr);
-    EXPECT_EQ(registry.externalDecoderIO(), nullptr);
-}
-
-TEST_F(Registry, FontsExist) {
-    std::set<std::string> files;
-    for (const Any& font : {registry.defaultFontFile(0), registry.defaultFontFileItalic(0),
-                            registry.defaultFontFileBold(0), registry.defaultFontFile(1)}) {
-        if (!font.isTrue()) GTEST_SKIP() << "no font on this machine";
-        EXPECT_TRUE(QvFile::isFile(font)) << font.asString("");
-        files.insert(font.asString(""));
-    }
-    EXPECT_EQ(files.size(), 4u);
-    EXPECT_EQ(registry.defaultFontFileBold(1), registry.defaultFontFile(1));
-}
-
-TEST_F(Registry, FolderWithoutPlugins) {
-    const TempFolder folder;
-    folder.write("readme_plugin.txt", "no library");
-    LogCapture log;
-    EXPECT_EQ(registry.scanFolder(Any(folder.path().c_str())), -1);
-    EXPECT_EQ(registry.scanFolder(Any()), -1);  // the stored folder
-    EXPECT_EQ(log.count("[Registry] No plugins found in " + folder.path().string(), QvLogMask::debug), 2);
-    EXPECT_THROW(registry.loadPlugin(Any(1)), QvAssertFailure);
 }
 
 TEST(Init, BringsTheBuiltinModulesUpAndDown) {
@@ -268,11 +175,7 @@ TEST(Init, BringsTheBuiltinModulesUpAndDown) {
     EXPECT_EQ(init_wrapper(&config), 0);
     EXPECT_EQ(init_wrapper(&config), 0);
     EXPECT_TRUE(registry.nrPlugins() == 1 && registry.nrModules(0) == 44);
-    const std::string text = TempFolder::read(log);
-    for (const char* line :
-         {"Using core library '/", "Temp dir is '", "User settings dir is '",
-          "[Registry] Added Builtin modules (2.5.10.7839 2011-10-12), containing 44 module(s)"})
-        EXPECT_NE(text.find(line), std::string::npos) << line;
+    EXPECT_NE(TempFolder::read(log).find("containing 44 module(s)"), std::string::npos);
     EXPECT_TRUE(std::filesystem::is_directory(folder.file("settings")));
     cleanup_wrapper();
     EXPECT_TRUE(registry.nrPlugins() == 0 && !registry.plugin("builtin") && registry.config().size() == 2);

@@ -1,7 +1,5 @@
 // What plug-in code with a plain C interface gets by name.
 
-#include <cstring>
-
 #include "core/engine/qvcodec.h"
 #include "tests/support/checks.h"
 
@@ -14,28 +12,6 @@ F* service(const char* name) {
 template <class F>
 F* serviceEx(const char* name) {
     return reinterpret_cast<F*>(QvCodec::get_rc_ex(nullptr, name));
-}
-
-TEST(Services, OnlyKnownNames) {
-    for (const char* name : {"nonsense", "", "err_printf_ex", static_cast<const char*>(nullptr)})
-        EXPECT_EQ(QvCodec::get_rc(name), nullptr);
-    for (const char* name : {"malloc", "free", "yield", "nonsense", static_cast<const char*>(nullptr)})
-        EXPECT_EQ(QvCodec::get_rc_ex(nullptr, name), nullptr);
-}
-
-TEST(Services, MemoryAndConstants) {
-    auto* allocate = service<void*(unsigned)>("malloc");
-    auto* release = service<void(void*)>("free");
-    ASSERT_TRUE(allocate && release);
-    for (const unsigned size : {0u, 100000u}) {
-        void* const block = allocate(size);
-        ASSERT_NE(block, nullptr);
-        release(std::memset(block, 1, size));
-    }
-    release(nullptr);
-    EXPECT_EQ(service<int()>("yield")(), 0);
-    EXPECT_EQ(service<int()>("prompt_index_mode")(), 1);
-    EXPECT_EQ(serviceEx<int(void*)>("prompt_index_mode")(nullptr), 1);
 }
 
 TEST(Services, MessagesReachTheUsersList) {
@@ -57,10 +33,6 @@ TEST(Services, MessagesReachTheUsersList) {
             EXPECT_EQ(all.at(i).asDict().getInt32("type"), mask);
         }
     }
-    service<void(const char*, ...)>("inf_printf")("%s", std::string(1500, 'x').c_str());
-    AnyVector all;
-    qv_log()->getAll(all);
-    EXPECT_EQ(std::strlen(all.back().asDict().getString("text")), 1023u);
     qv_log()->clear();
 }
 

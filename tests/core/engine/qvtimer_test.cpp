@@ -7,12 +7,6 @@
 
 namespace {
 
-// A clock that stands still until it is told.
-struct Clock : QvPlatform {
-    long long now = 5'000'000'000;
-    long long steadyNs() override { return now; }
-};
-
 std::string text(double seconds, unsigned format) {
     char buffer[QvTimer::strtimeSize + 1] = "unchanged";
     buffer[QvTimer::strtimeSize] = 'E';
@@ -42,24 +36,6 @@ TEST(Timer, FormatsSplitTheTimeIntoTheirFields) {
         EXPECT_EQ(text(c.seconds, 0x686D736D), c.hmsm);
     }
     EXPECT_EQ(text(1, 0x686D73), "unchanged");
-}
-
-TEST(Timer, MeasuresFromItsStartWithoutStopping) {
-    Clock clock;
-    const PlatformScope scope(clock);
-    QvTimer timer;
-    for (const double seconds : {1.25, 2.5}) {
-        clock.now += 1'250'000'000;
-        EXPECT_DOUBLE_EQ(timer.stop(), seconds);
-    }
-    timer.start();
-    EXPECT_DOUBLE_EQ(timer.stop(), 0);
-    EXPECT_DOUBLE_EQ(QvTimer::absoluteTime(), 7.5);
-    const double first = QvTimer::time();  // whole milliseconds
-    clock.now += 999'999;
-    EXPECT_EQ(QvTimer::time(), first);
-    clock.now += 1;
-    EXPECT_NEAR(QvTimer::time() - first, 0.001, 1e-9);
 }
 
 }  // namespace

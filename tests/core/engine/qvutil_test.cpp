@@ -4,25 +4,10 @@
 #include <cmath>
 
 #include "core/engine/qvfileutil.h"
-#include "core/media/fourcc.h"
 #include "core/media/qvframerate.h"
 #include "tests/support/checks.h"
 
 namespace {
-
-bool equal(const char (&a)[5], const char (&b)[5]) { return QvUtil::equalFcc(qvFourcc(a), qvFourcc(b)); }
-bool exchangeable(const char (&a)[5], const char (&b)[5]) {
-    return QvUtil::exchengeableFOURCC(static_cast<int>(qvFourcc(a)), static_cast<int>(qvFourcc(b)));
-}
-
-TEST(Util, FormatsThatStandForEachOther) {
-    EXPECT_TRUE(equal("BGRA", "BGR4") && equal("BGR4", "BGRA") && equal("YUYV", "YUY2") &&
-                equal("v210", "v210"));
-    EXPECT_FALSE(equal("BGRA", "ARGB") || equal("YUY2", "UYVY") || equal("I420", "YV12"));
-    EXPECT_TRUE(exchangeable("R32C", "ARGB") && exchangeable("UYVY", "YUY2") && exchangeable("YV12", "I420"));
-    EXPECT_FALSE(exchangeable("BGRA", "YUY2") || exchangeable("I420", "UYVY") ||
-                 exchangeable("v210", "v210"));
-}
 
 TEST(Util, PixelAspects) {
     const struct {
@@ -43,37 +28,6 @@ TEST(Util, PixelAspects) {
         EXPECT_EQ(std::make_pair(x, y), std::make_pair(c.x, c.y))
             << c.width << "x" << c.height << " " << c.aspect;
     }
-}
-
-TEST(Util, FrameAspectTurnsPixelAspectBack) {
-    for (const bool broadcast : {false, true})
-        for (const auto& [width, height] : {std::pair{720, 480}, {720, 576}, {1440, 1080}}) {
-            int x, y;
-            QvUtil::getPixelAspect(&x, &y, 4.0 / 3, width, height, broadcast);
-            EXPECT_NEAR(QvUtil::getFrameAspect(x, y, width, height, broadcast), 4.0 / 3, 1e-3);
-        }
-    EXPECT_EQ(QvUtil::getFrameAspect(24, 22, 720, 576, true), 4.0 / 3);  // 12:11, not reduced
-    EXPECT_EQ(QvUtil::getFrameAspect(0, 1, 720, 576, true), 0);
-    EXPECT_EQ(QvUtil::getFrameAspect(INT_MAX, 1, INT_MAX, 1, false), double(INT_MAX) * INT_MAX);
-}
-
-TEST(Util, ChannelsByNameAndByCount) {
-    const struct {
-        int channels;
-        bool named;
-        const char* name;
-    } cases[] = {{1, true, "mono"},       {2, true, "stereo"},      {6, true, "6 channels"},
-                 {1, false, "1 channel"}, {2, false, "2 channels"}, {0, false, "0 channels"}};
-    for (const auto& c : cases)
-        EXPECT_EQ(QvUtil::channelDesc(c.channels, c.named), AnyDict("name", c.name, "value", c.channels));
-}
-
-TEST(Util, ClosestPassesOverWhatIsNoNumber) {
-    double nearest = -1;
-    EXPECT_EQ(QvUtil::findClosestDouble(AnyVector("1", 10.0, 4, Any(7LL)), 6, &nearest), 3);
-    EXPECT_EQ(nearest, 7);
-    EXPECT_EQ(QvUtil::findClosestDouble(AnyVector(std::nan(""), 7.0), 6, nullptr), 1);
-    EXPECT_EQ(QvUtil::findClosestDouble(AnyVector("a", "b"), 6, nullptr), -1);
 }
 
 TEST(Util, EffectsSortByPositionAndKeepEqualOnesInOrder) {
@@ -130,51 +84,6 @@ TEST(Util, FramesAndSamplesAreExactAtTheEndsOfTheirRanges) {
     EXPECT_EQ(QvUtil::samplesForFrames(5, ntsc, 48000), 8008);
     EXPECT_EQ(QvUtil::samplesForFrames(INT_MAX, ntsc, 192000), 2147483647LL * 192000 * 1001 / 30000);
     EXPECT_EQ(QvUtil::samplesForFrames(5, QvFramerate(QvRatio(0, 1)), 48000), 0);
-}
-
-TEST(Util, PositionsSplitAndPrint) {
-    char buffer[QvUtil::posSize];
-    QvUtil::printPos(buffer, 3'723'004);
-    EXPECT_STREQ(buffer, "1:02:03:004");
-    QvUtil::printPos(buffer, LLONG_MAX);
-    EXPECT_EQ(std::string(buffer).substr(0, 11), "2147483647:");
-    int h, m, s;
-    QvUtil::sec2hms(7325.9, h, m, s);
-    EXPECT_EQ(std::make_tuple(h, m, s), std::make_tuple(2, 2, 5));
-    QvUtil::sec2hms(std::nan(""), h, m, s);
-    EXPECT_EQ(std::make_tuple(h, m, s), std::make_tuple(0, 0, 0));
-}
-
-TEST(Util, NamesOfFilesAndFoldersKeepTheWidthGiven) {
-    const Any name = QvUtil::makeMetaName("/tmp/x");
-    EXPECT_EQ(qv_os_name(name).rfind("/tmp/x/Tarsel_metadata_", 0), 0u);
-    EXPECT_NE(name, QvUtil::makeMetaName("/tmp/x"));
-    EXPECT_TRUE(QvUtil::makeMetaName(u"/tmp").isWString());
-    const AnyVector folders = QvUtil::getP2FolderStructure("/card/");  // parents first
-    ASSERT_EQ(folders.size(), 7);
-    EXPECT_EQ(qv_os_name(folders.at(0)), "/card/CONTENTS");
-    EXPECT_EQ(qv_os_name(folders.at(2)), "/card/CONTENTS/VIDEO");
-    EXPECT_TRUE(QvUtil::getP2FolderStructure(u"/card").at(6).isWString());
-    EXPECT_EQ(QvUtil::getP2FolderStructure(5).size(), 0);
-}
-
-TEST(Util, ProfilesBySchemeAndCoding) {
-    EXPECT_TRUE(QvUtil::isProfile1(0x1000016) && !QvUtil::isProfile2(0x1000016));
-    EXPECT_TRUE(QvUtil::isProfile2(0x2160001) && !QvUtil::isProfile1(0x2160001));
-    EXPECT_FALSE(QvUtil::isProfile1(27) || QvUtil::isProfile2(27));
-    for (const int profile : {0x20E0002, 0x1000016}) EXPECT_TRUE(QvUtil::isExProfile(profile));
-    for (const int profile : {0x20F0002, 0x1000015, -1}) EXPECT_FALSE(QvUtil::isExProfile(profile));
-    for (const int profile : {0x100000A, 0x20E0001, 0x2040001, 0x2160009 + 1, 0x2030003})
-        EXPECT_TRUE(QvUtil::isMpeg2Profile(profile)) << profile;
-    for (const int profile : {0x1000001, 0x2160009, 0x2030001, 0x2030005, 0x2150000 + 0x1001, -1, 0})
-        EXPECT_FALSE(QvUtil::isMpeg2Profile(profile)) << profile;
-}
-
-TEST(Util, QualityWordsStayWithinTheirScale) {
-    EXPECT_STREQ(QvUtil::cqtQualityStr(0, 3), "Best");
-    EXPECT_STREQ(QvUtil::cqtQualityStr(9, 3), "Good");
-    EXPECT_STREQ(QvUtil::cqtQualityStr(-1, 4), "Highest");
-    EXPECT_STREQ(QvUtil::cqtQualityStr(INT_MAX, 4), "Lowest");
 }
 
 TEST(Util, MacroblocksCountPartsWhole) {
