@@ -3,7 +3,6 @@
 
 #include <algorithm>
 #include <cstring>
-#include <map>
 #include <string>
 #include <vector>
 
@@ -21,32 +20,24 @@ class FakeDecoder : public BaseDecodePipe {
     std::vector<int> values = {0};
     int failAtSample = -1;  // reads that reach it fail with -1
     std::vector<std::string> calls;
-    std::map<std::string, Any> given;
     int openResult = 0;
     AnyVector overridable = AnyVector("frameAspect", "codec");
 
     using BaseDecodePipe::getParam;
     int setParam(const char* name, const Any& value) override {
-        if (std::strcmp(name, "FOURCC") == 0 && !takesFourcc) return _raiseInvalidParam(name);
-        if (std::strcmp(name, "filenames") == 0 || std::strcmp(name, "FOURCC") == 0 ||
-            std::strcmp(name, "openParameters") == 0) {
-            given[name] = value;
-            return 0;
-        }
-        return BaseDecodePipe::setParam(name, value);
+        if (std::strcmp(name, "filenames") != 0) return BaseDecodePipe::setParam(name, value);
+        return 0;
     }
-    bool takesFourcc = true;
 
     int open() override {
         calls.push_back("open");
         if (openResult != 0) return setError(openResult, "will not open");
         auto video = std::make_unique<DPipeVideoStream>();
-        video->params = AnyDict("framerate", QvFramerate(25.0), "frames", 100, "frameAspect", 1.5, "vBitrate",
-                                1234567.8, "codecParams", AnyDict("pid", 33));
+        video->params = AnyDict("framerate", QvFramerate(25.0), "frames", 100, "frameAspect", 1.5);
         addStream(std::move(video));
         auto audio = std::make_unique<DPipeAudioStream>();
         audio->params = AnyDict("samplerate", 48000, "channels", 1, "bitsPerSample", 16, "bytesPerSample", 2,
-                                "samples", samples, "aBitrate", 192);
+                                "samples", samples);
         audio->pcm = std::make_unique<QvPcm>();
         audio->pcm->init(5000, 1, 2, 48000);
         pcm_ = audio->pcm.get();
@@ -80,9 +71,6 @@ class FakeDecoder : public BaseDecodePipe {
     QvPcm* getAudioPtr(int) override { return pcm_; }
     bool selectedWhenRead = false;
     AnyVector overridableParams(int, int) override { return overridable; }
-
-    using BaseDecodePipe::checkState;
-    using BaseDecodePipe::checkStream;
 
   private:
     QvPcm* pcm_ = nullptr;

@@ -35,9 +35,6 @@ TEST(AudioStreamReport, PeaksOfEachWidthHaveOneScale) {
         EXPECT_EQ(report.processGroup(pcmOf(c.width, c.bytes)), 0);
         EXPECT_EQ(report.peak(0), c.peak) << c.width;
     }
-    QvAudioStreamReport report;
-    report.init(100, 2, 48000, 32);
-    EXPECT_THROW(report.processGroup(pcmOf(4, "abcdefgh")), QvAssertFailure);
 }
 
 TEST(AudioStreamReport, RangesAreOfSamplesAndClamped) {
@@ -50,11 +47,6 @@ TEST(AudioStreamReport, RangesAreOfSamplesAndClamped) {
     EXPECT_NEAR(report.peakdB(0, 1600), -6.0206, 1e-4);
     EXPECT_NEAR(report.peakdB(-100000, 1LL << 60), -6.0206, 1e-4);
     EXPECT_EQ(report.peakdB(100000, 200000), -91.0);
-    const QvAudioStreamReport copy = report;
-    report.init(0, 2, 48000, 16);
-    EXPECT_EQ(report.nrGroups(), 1);
-    EXPECT_EQ(report.peakdB(0, 0), -91.0);
-    EXPECT_EQ(copy.peak(1), 0x4000);
     EXPECT_EQ(report.init(std::numeric_limits<long long>::max(), 2, 48000, 16), -3);
 }
 

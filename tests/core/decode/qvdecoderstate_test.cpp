@@ -6,7 +6,6 @@
 #include <functional>
 #include <set>
 
-#include "core/engine/qvlog.h"
 #include "tests/support/checks.h"
 #include "tests/support/temp_folder.h"
 #include "tests/support/wav_bytes.h"
@@ -51,17 +50,12 @@ QvDecoderState sample() {
 }
 
 TEST_F(DecoderState, EverythingComesBack) {
-    EXPECT_FALSE(manager.stateStored(file));
     const QvDecoderState state = sample();
     ASSERT_EQ(manager.storeState(file, state), 0);
-    EXPECT_TRUE(manager.stateStored(file));
-    EXPECT_EQ(kept().filename().string().size(), 32u);
     EXPECT_TRUE(fs::exists(kept() / "my_index.dat"));
-    EXPECT_FALSE(fs::exists(kept() / "small.dat"));
 
     QvDecoderStateManager later("index", Any(folder.path().c_str()));
     QvDecoderState again;
-    again.set("stale", Any(1));
     ASSERT_EQ(later.restoreState(file, again), 0);
     EXPECT_TRUE(static_cast<const AnyDict&>(again) == state);
     EXPECT_EQ(later.restoreState("/no/such/file", again), -1);
@@ -78,9 +72,6 @@ TEST_F(DecoderState, StoringAgainReplacesAndAChangedFileVoidsIt) {
     fs::last_write_time(path, fs::last_write_time(path) + std::chrono::seconds(10));
     EXPECT_FALSE(manager.stateStored(file));
     EXPECT_TRUE(kept().empty()) << "and removes it";
-    ASSERT_EQ(manager.storeState(file, sample()), 0);
-    EXPECT_EQ(manager.deleteState(file), 0);
-    EXPECT_FALSE(manager.stateStored(file));
 }
 
 TEST_F(DecoderState, DamageCountsAsNotStored) {
@@ -90,13 +81,7 @@ TEST_F(DecoderState, DamageCountsAsNotStored) {
     } cases[] = {
         {"no document", [this] { fs::remove(kept() / "state.xml"); }},
         {"no XML", [this] { folder.write("index/" + kept().filename().string() + "/state.xml", "<"); }},
-        {"another root",
-         [this] {
-             rewriteDocument("<decoderState", "<encoderState");
-             rewriteDocument("</decoderState", "</encoderState");
-         }},
         {"no time", [this] { rewriteDocument("modified", "modifies"); }},
-        {"no block", [this] { fs::remove(kept() / "my_index.dat"); }},
         {"a cut block", [this] { fs::resize_file(kept() / "my_index.dat", 30); }},
         {"a name that leads out to a good block",
          [this] {
@@ -116,14 +101,12 @@ TEST_F(DecoderState, DamageCountsAsNotStored) {
 TEST_F(DecoderState, NamesOfKeysNeverBecomePaths) {
     QvDecoderState state;
     state.set("../../out", block(500));
-    state.set("a_name_that_leaves_no_room_for_a_prefix", block(300));
     ASSERT_EQ(manager.storeState(file, state), 0);
     for (const auto& entry : fs::recursive_directory_iterator(folder.path()))
         EXPECT_NE(entry.path().filename(), "out.dat");
     QvDecoderState again;
     ASSERT_EQ(manager.restoreState(file, again), 0);
     EXPECT_TRUE(again["../../out"] == block(500)) << "stays in the document";
-    EXPECT_TRUE(again["a_name_that_leaves_no_room_for_a_prefix"] == block(300));
 }
 
 TEST_F(DecoderState, ClearingTakesOnlyWhatItMade) {
@@ -139,22 +122,6 @@ TEST_F(DecoderState, ClearingTakesOnlyWhatItMade) {
     EXPECT_EQ(left,
               (std::set<std::string>{"0123456789ABCDEF0123456789ABCDEF", "0123456789abcdef0123456789abcde",
                                      "0123456789abcdef0123456789abcdef", "cache"}));
-}
-
-TEST_F(DecoderState, WithoutAFolderNothingIsKept) {
-    fs::remove_all(folder.path() / "index");
-    EXPECT_EQ(manager.storeState(file, sample()), -1);
-    EXPECT_FALSE(manager.stateStored(file));
-    folder.write("plain", "");
-    qv_log()->clear();
-    QvDecoderStateManager none("index", Any(folder.file("plain").c_str()));
-    EXPECT_TRUE(none.disabled());
-    EXPECT_EQ(qv_log()->nrErrors(), 1);
-    QvDecoderState state;
-    EXPECT_EQ(none.storeState(file, sample()), -1);
-    EXPECT_EQ(none.restoreState(file, state), -1);
-    EXPECT_FALSE(none.stateStored(file));
-    none.clearStates();
 }
 
 }  // namespace

@@ -3,10 +3,8 @@
 #include <climits>
 #include <map>
 
-#include "core/encode/qvmuxer.h"
 #include "core/media/qvgeometry.h"
 #include "tests/support/checks.h"
-#include "tests/support/log_capture.h"
 #include "tests/support/test_stream.h"
 
 namespace {
@@ -24,8 +22,6 @@ class Video : public QvVideoEncoder {
         const auto found = values.find(name);
         if (found != values.end())
             value = found->second;
-        else if (std::string(name) == "frameAspect")
-            value = 1.5;
         else
             QvVideoEncoder::getParam(name, value);
     }
@@ -36,29 +32,6 @@ class Video : public QvVideoEncoder {
     QvFrame* lastFrame() override { return nullptr; }
 
     std::map<std::string, Any> values;
-};
-
-class Audio : public QvAudioEncoder {
-  public:
-    int open() override { return 0; }
-    int close() override { return 0; }
-    int writePcm(QvPcm*, int) override { return 0; }
-};
-
-class Muxer : public QvMuxer {
-  public:
-    int open() override { return 0; }
-    int close() override { return 0; }
-    QvBufStream* addStream(int, const AnyDict&) override { return nullptr; }
-    void removeStreams(int) override {}
-    void removeStream(int, int) override {}
-    int nrStreams(int) const override { return 0; }
-    QvBufStream* stream(int, int) const override { return nullptr; }
-    int setStreamParam(int program, int stream, const char* name, const Any& value) override {
-        if (std::string(name) == "unknown") return _raiseInvalidParam(name);
-        return program + stream + value.toInt32();
-    }
-    void getStreamParams(int, int, AnyDict& params) const override { params = AnyDict("pid", 33); }
 };
 
 TEST(Encoder, KnowsItsStreamAndTheStreamIt) {
@@ -102,50 +75,6 @@ TEST(Encoder, BitratesAreSpreadAndGathered) {
     EXPECT_EQ(odd.target, INT_MAX);
     EXPECT_EQ(odd.min, -1);
     EXPECT_EQ(odd.max, 0);
-}
-
-TEST(Encoder, NamesThatEveryOneAcceptsAndTracesOnce) {
-    Video video;
-    Audio audio;
-    Muxer muxer;
-    const struct {
-        QvCodec* codec;
-        std::vector<const char*> names;
-        int kind;
-    } rows[] = {{&video, {"timecodeOffset", "extension", "adjustSettings", "getQualityStats"}, 7},
-                {&audio, {"timecodeOffset", "smartRender", "adjustSettings", "tsAdjust"}, 6},
-                {&muxer,
-                 {"profile", "type", "pal", "filename", "settings", "bitrate", "adjustSettings",
-                  "_totalFrames", "meta", "timecodeOffset"},
-                 10}};
-    LogCapture log;
-    for (const auto& row : rows) {
-        SCOPED_TRACE(row.kind);
-        row.codec->init();
-        for (const char* name : row.names) EXPECT_EQ(row.codec->setParam(name, 1), 0) << name;
-        EXPECT_THROW(row.codec->setParam("unknown", 1), QvParamException);
-        for (int kind = 0; kind < 20; ++kind)
-            EXPECT_EQ(row.codec->getInterface(kind), kind == row.kind ? row.codec : nullptr) << kind;
-    }
-    EXPECT_EQ(log.count("setParam: adjustSettings"), 3);
-    EXPECT_EQ(log.count("setParam: unknown"), 3);
-    EXPECT_EQ(video.getParam("frameAspectEx"), Any(1.5));
-    EXPECT_EQ(video.getParam("nrViews"), Any(1));
-    EXPECT_EQ(video.getParam("multiViewPossible"), Any(0));
-}
-
-TEST(Muxer, StreamParameters) {
-    Muxer muxer;
-    muxer.init();
-    EXPECT_EQ(muxer.setStreamParams(10, 1, AnyDict("a", 100, "unknown", 7, "z", 1000)), 11 + 100 + 11 + 1000);
-    Any value;
-    muxer.getStreamParam(1, 0, "pid", value);
-    EXPECT_EQ(value, Any(33));
-    muxer.getStreamParam(1, 0, "other", value);
-    EXPECT_FALSE(value.isValid());
-    EXPECT_EQ(static_cast<QvCodec&>(muxer).getParam("maxStreams"),
-              Any(AnyDict("vids", 1, "auds", 1, "subs", 0, "total", 2)));
-    EXPECT_EQ(muxer.flush(), 0);
 }
 
 }  // namespace
