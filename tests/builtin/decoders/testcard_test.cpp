@@ -37,23 +37,16 @@ TEST_F(Card, EveryPartIsInItsPlace) {
         unsigned colour;
     } pixels[] = {
         {"frame, top left", 0, 0, 0xFFFFFF},
-        {"frame, bottom right", 639, 479, 0xFFFFFF},
-        {"middle row", 300, 240, 0xFFFFFF},
         {"grid row", 300, 210, 0xAAAAAA},
         {"last grid column", 20, 445, 0xAAAAAA},
-        {"ground", 330, 215, 0x808080},
-        {"first second box", 15, 448, 0x303030},
         {"the last box", 15 + 24 * 24, 450, 0x303030},
         {"field patch, first field", 640 - 135, 15, 0xFFFF00},
-        {"field patch, second row left", 640 - 135, 16, 0x808080},
         {"field patch, second field", 640 - 135 + 60, 16, 0x00FFFF},
         {"format box", 15, 15, 0x800000},
         {"white bar", 15, 90, 0xFFFFFF},
         {"blue bar", 15 + 6 * 40, 209, 0x0000FF},
         {"darkest gray", 20, 270, 0x000000},
-        {"lightest gray", 20 + 10 * 27, 359, 0xFFFFFF},
         {"circle, right", 480 + 90, 240, 0xFFFFFF},
-        {"circle, top", 480, 150, 0xFFFFFF},
     };
     for (const auto& p : pixels) EXPECT_EQ(pixel(p.x, p.y), p.colour) << p.what;
     EXPECT_EQ((lines.at[{19, 12}]), "640x480 25p ");
@@ -76,25 +69,6 @@ TEST_F(Card, MovingPartsFollowTheFrameNumber) {
     EXPECT_EQ((lines.at[{19, 383}]), "00:01:00:03");
     EXPECT_EQ((lines.at[{19, 413}]), "#      1503");
     EXPECT_EQ((lines.at[{490, 386}]), "view #2");
-}
-
-TEST_F(Card, FractionalRatesEndInANarrowBox) {
-    frame.framerate = QvFramerate(29.97);
-    drawTestCard(frame, 4 / 3.0, nullptr);
-    int boxes = 0;
-    bool inside = false;
-    for (int x = 15; x < 640 - 15; ++x) {
-        const bool dark = pixel(x, 460) == 0x303030;
-        if (dark && !inside) ++boxes;
-        inside = dark;
-    }
-    EXPECT_EQ(boxes, 29) << "the thirtieth begins where the last one ends";
-    EXPECT_EQ(pixel(15 + static_cast<int>(29 * 610 / 30.0) + 5, 460), 0x303030u);
-}
-
-TEST_F(Card, OtherFormatsAssert) {
-    frame.init(QvFourcc::BGR3, 640, 480);
-    EXPECT_THROW(drawTestCard(frame, 4 / 3.0, nullptr), QvAssertFailure);
 }
 
 }  // namespace
