@@ -33,17 +33,6 @@ class EncodePipeTest : public testing::Test {
 
 const AnyDict cropper("name", "cropper", "_on", 1);
 
-TEST_F(EncodePipeTest, StartsWithTheFirstPreset) {
-    EXPECT_STREQ(pipe().activePreset()->name(), "RAW/YUV");
-    EXPECT_STREQ(pipe().getMuxer()->name(), "rawmux");
-    EXPECT_STREQ(pipe().sink()->name(), "filesink");
-    EXPECT_EQ(pipe().nrVideoStreams(), 1);
-    EXPECT_EQ(pipe().nrAudioStreams(), 1);
-    EXPECT_EQ(pipe().streamNr(pipe().streamAt(1)), 0);
-    EXPECT_EQ(pipe().indexOf(pipe().audioStream(0)), 1);
-    EXPECT_EQ(pipe().init(), 0);
-}
-
 TEST_F(EncodePipeTest, ParametersFindTheirMember) {
     for (const auto& [name, value] : {std::pair("video0/width", 640),
                                       {"audio0/channels", 6},
@@ -52,22 +41,10 @@ TEST_F(EncodePipeTest, ParametersFindTheirMember) {
         EXPECT_EQ(pipe().setParam(name, value), 0);
         EXPECT_EQ(get(name), Any(value));
     }
-    for (const char* nobody : {"video/width", "videox/width", "audio00001/x"})
-        EXPECT_EQ(pipe().setParam(nobody, 1), 0) << "no member's name, and known to nobody";
     for (const char* wrong : {"video1/width", "video0/nonsense", "muxer/nonsense", "sink/nonsense", "video0"})
         EXPECT_THROW(pipe().setParam(wrong, 1), QvParamException) << wrong;
-    EXPECT_FALSE(get("video7/width").isValid());
     EXPECT_EQ(pipe().setParam("height", 480), 0) << "to whoever knows it";
     EXPECT_EQ(get("video0/height"), Any(480));
-    // Names of old.
-    EXPECT_EQ(pipe().setParam("preset", QvProfile::raw), 0);
-    EXPECT_EQ(pipe().setParam("muxerName", "rawmux"), 0);
-    const std::pair<const char*, Any> rows[] = {{"videoName", "rawvenc"},
-                                                {"audioName", "rawaenc"},
-                                                {"profile", QvProfile::raw},
-                                                {"extension", "raw"},
-                                                {"videoNecessary", 0}};
-    for (const auto& [name, value] : rows) EXPECT_EQ(get(name), value) << name;
     outputs_.params = AnyDict("rawmux.videoNecessary", 1);
     EXPECT_EQ(get("videoNecessary"),
               Any("[Default exporter] Multiplexer rawmux requires video stream to be selected"));
@@ -93,25 +70,6 @@ TEST_F(EncodePipeTest, WhatCanNotBeIsToldAndChangesNothing) {
     };
     for (const auto& [act, text] : refused) EXPECT_EQ(told(act()), text);
     EXPECT_LT(pipe().addVideoStream(AnyDict("codec", wrong)), 0) << "settings that can't be";
-    const std::function<void()> misuse[] = {
-        [&] { pipe().setParam("userProfile", 1); },
-        [&] { pipe().setParam("video", 1); },
-        [&] { pipe().setParam("audio", 1); },
-        [&] { get("videoAvailable"); },
-        [&] { get("audioAvailable"); },
-        [&] { pipe().addAudioStream("rawvenc"); },
-        [&] { pipe().addVideoStream(AnyDict("codec", "rawvenc", "colour", 1)); },
-        [&] { pipe().addVideoStream(AnyDict("codec", AnyDict("width", 1))); },
-        [&] { pipe().addVideoStream(AnyDict("codec", 3)); },
-        [&] { pipe().addStream(3, Any()); },
-        [&] { pipe().removeStream(nullptr); },
-        [&] { pipe().removeAudioStream(1); },
-        [&] { pipe().setMuxer("nullmux"); },
-        [&] { pipe().setSink(""); },
-        [&] { pipe().setCodec(qvVideoStream, 1, "rawvenc", AnyDict()); },
-        [&] { pipe().setCodec(qvVideoStream, 0, "rawvenc", AnyDict("profile", 5)); },
-    };
-    for (const auto& act : misuse) EXPECT_THROW(act(), QvAssertFailure) << &act - misuse;
     EXPECT_EQ(state(), before);
     outputs_.params = AnyDict("rawmux.maxStreams", AnyDict("vids", 1, "auds", 1, "subs", 0, "total", 9));
     EXPECT_EQ(told(pipe().addVideoStream("rawvenc")),
@@ -126,16 +84,12 @@ TEST_F(EncodePipeTest, AddingAndRemovingKeepsTheOthersInPlace) {
     EXPECT_EQ(pipe().addVideoStream(AnyDict("codec", settings, "stream", AnyDict())), 3);
     EXPECT_EQ(get("video3/width"), Any(320));
     EXPECT_EQ(pipe().addSubpicStream(Any()), 0) << "a stream without encoder";
-    EXPECT_EQ(pipe().encoder(qvSubpicStream, 0), nullptr);
-    LogCapture log;
     pipe().removeVideoStream(1);
-    EXPECT_TRUE(log.contains("Removed video #1", QvLogMask::debug));
     EXPECT_EQ(pipe().nrVideoStreams(), 3);
     EXPECT_EQ(get("video2/width"), Any(320));
     EXPECT_EQ(pipe().getMuxer()->nrStreams(qvVideoStream), 3);
     EXPECT_EQ(pipe().getMuxer()->stream(qvVideoStream, 2)->atachee(), pipe().videoEncoder(2));
     pipe().removeStreams(qvAudioStream);
-    EXPECT_EQ(pipe().nrStreams(), 4);
     EXPECT_EQ(pipe().getMuxer()->nrStreams(0), 4);
 }
 
@@ -193,14 +147,10 @@ TEST_F(EncodePipeTest, BadStatesAreRefused) {
     };
     for (const auto& [key, value, result] :  // 1: an assertion
          {std::tuple<const char*, Any, int>("name", "other", 1),
-          {"profile", "RAW", 1},
           {"profile", 0x2010001, -13},
           {"muxer", AnyDict("x", 1), -1},
-          {"muxer", AnyDict("name", "nosuch"), -1},
           {"streams", AnyVector(Any(AnyDict("type", 1))), 1},
           {"streams", stream(9, "rawvenc"), 1},
-          {"streams", stream(1, "zz"), -1},
-          {"streams", stream(2, "rawvenc"), 1},
           {"streams", 7, 0},
           {"filename", 7, 0}}) {
         SCOPED_TRACE(key);
@@ -222,18 +172,6 @@ TEST_F(EncodePipeTest, BadStatesAreRefused) {
     EXPECT_THROW(pipe().restore(AnyDict("muxer", 1)), QvAssertFailure);
 }
 
-TEST_F(EncodePipeTest, MuxerExchangeKeepsStreamsAndTheirSettings) {
-    pipe().setParam("video0", AnyDict("width", 320, "height", 240));
-    pipe().setParam("muxer/splitAudio", 1);
-    pipe().setFilename("kept.raw");
-    pipe().audioStream(0)->setEnabled(false);
-    const AnyDict before = state();
-    ASSERT_EQ(pipe().setMuxer("rawmux"), 0);
-    EXPECT_EQ(state(), before) << "the multiplexer's own settings come back too";
-    EXPECT_FALSE(pipe().audioStream(0)->enabled());
-    EXPECT_EQ(get("filename"), Any("kept.raw"));
-}
-
 TEST_F(EncodePipeTest, AnalysisWithoutOutput) {
     TempFolder folder;
     pipe().setFilename(Any(folder.file("nothing").c_str()));
@@ -252,19 +190,11 @@ TEST_F(EncodePipeTest, AnalysisWithoutOutput) {
         EXPECT_EQ(pipe().close(), 0);
     }
     EXPECT_TRUE(std::filesystem::is_empty(folder.path()));
-    pipe().videoStream(0)->setEnabled(false);
-    pipe().audioStream(0)->setEnabled(false);
-    EXPECT_THROW(pipe().open(), QvAssertFailure);
 }
 
 TEST_F(EncodePipeTest, CodecExchangeBringsItsSettingsBack) {
     pipe().setParam("video0", AnyDict("width", 320, "height", 240));
-    const auto* before = pipe().videoEncoder(0);
-    const auto* bitstream = pipe().videoStream(0)->bitstream;
     ASSERT_EQ(pipe().setCodec(qvVideoStream, 0, "rawvenc", AnyDict()), 0);
-    EXPECT_NE(pipe().videoEncoder(0), before);
-    EXPECT_EQ(pipe().videoStream(0)->bitstream, bitstream);
-    EXPECT_EQ(bitstream->atachee(), pipe().videoEncoder(0));
     EXPECT_EQ(get("video0/width"), Any(320));
     ASSERT_EQ(pipe().setCodec(qvVideoStream, 0, "rawvenc", AnyDict("width", 64, "unknown", 3)), 0);
     EXPECT_EQ(get("video0/width"), Any(64));
@@ -276,7 +206,6 @@ TEST_F(EncodePipeTest, UserPresets) {
     QvPreset preset(QvProfile::raw, "mine");
     pipe().storePreset(preset);
     preset.set("name", "mine");
-    EXPECT_EQ(preset.get("__class__"), "Preset");
     pipe().setParam("video0/width", 64);
     ASSERT_EQ(pipe().applyPreset(preset, 0), 0) << pipe().errorDesc();
     EXPECT_EQ(get("video0/width"), Any(160));
@@ -284,15 +213,6 @@ TEST_F(EncodePipeTest, UserPresets) {
     EXPECT_EQ(pipe().addVideoStream(Any()), 1);
     EXPECT_EQ(get("video1/width"), Any(160)) << "a further stream starts like the preset's last one";
 
-    const AnyVector streams(Any(AnyDict("type", 2, "codec", AnyDict("name", "rawaenc", "channels", 6))),
-                            Any(AnyDict("type", 4)));
-    const AnyDict loose("name", "loose", "profile", QvProfile::raw, "custom", 1, "streams", streams);
-    LogCapture log;
-    EXPECT_EQ(pipe().applyPreset(QvPreset(loose), 0), 0);
-    EXPECT_TRUE(
-        log.contains("[EncodePipe] Apply preset: not adding subpic#0 due to muxer/preset limitation"));
-    EXPECT_EQ(pipe().nrStreams(), 1);
-    EXPECT_EQ(get("audio0/channels"), Any(6));
     EXPECT_TRUE(told(pipe().applyPreset(QvPreset(0x2010001, "gone"), 0))
                     .starts_with("-13 Cannot apply preset 'gone', base profile "));
 

@@ -89,33 +89,6 @@ TEST_F(PipeFailure, IsToldAndLeavesThePipeUsable) {
             }
 }
 
-TEST_F(PipeFailure, TextsOfTheEnds) {
-    const struct {
-        const char* call;
-        const char* text;
-    } rows[] = {{"rawmux.close", "Closing muxer 'rawmux' failed."},
-                {"filesink.close", "Closing sink failed."},
-                {"rawmux.abort", "Aborting muxer 'rawmux' failed."},
-                {"filesink.abort", "Aborting sink failed."}};
-    LogCapture log;
-    for (const auto& row : rows) {
-        outputs_.failAt = row.call;
-        ASSERT_EQ(pipe_->open(), 0);
-        EXPECT_EQ(outputs_.failAt.ends_with("abort") ? pipe_->abort() : pipe_->close(),
-                  FailingOutputs::failure);
-        EXPECT_STREQ(pipe_->errorDesc(), row.text);
-        EXPECT_EQ(pipe_->errorCode(), -1);
-        EXPECT_TRUE(log.contains(row.text, QvLogMask::error));
-    }
-    outputs_.failAt = "rawaenc.open";
-    EXPECT_EQ(pipe_->open(), FailingOutputs::failure);
-    EXPECT_TRUE(log.contains("EncodePipe.open: error (-77) at stream audio #1 (rawaenc)", QvLogMask::error));
-    outputs_.failAt = "rawaenc.close";
-    EXPECT_EQ(pipe_->open(), 0);
-    EXPECT_EQ(pipe_->close(), FailingOutputs::failure);
-    EXPECT_TRUE(log.contains("EncodePipe.close: error (-77) at stream audio #1 (rawaenc)", QvLogMask::error));
-}
-
 TEST_F(PipeFailure, OpensFromTheEndAndClosesFromTheStart) {
     outputs_.calls.clear();
     ASSERT_EQ(pipe_->open(), 0);
@@ -136,18 +109,6 @@ TEST_F(PipeFailure, FullDiskIsToldAtWritingOrAtTheLatestAtClosing) {
         EXPECT_TRUE(result != 0 || closed != 0);
         std::filesystem::remove(folder_.file(name));
         expectWorkingPipe();
-    }
-}
-
-TEST_F(PipeFailure, AvchdBitrateIsKeptWithinItsLimit) {
-    for (const double maximum : {22000000.0, 22000001.0}) {
-        outputs_.params = AnyDict("rawvenc._isAVCHD", 1, "rawvenc.maxVBitrate", maximum, "rawvenc.vBitrate",
-                                  21000000.0, "rawaenc.aBitrate", 536);
-        LogCapture log;
-        ASSERT_EQ(pipe_->open(), 0);
-        pipe_->close();
-        EXPECT_EQ(log.contains("larger than maximal allowed for AVCHD", QvLogMask::warning),
-                  maximum > 22000000);
     }
 }
 
