@@ -1,7 +1,6 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
-#include <climits>
 #include <string>
 #include <vector>
 
@@ -59,10 +58,8 @@ TEST_F(Layout, CharactersStandInTheirOrder) {
     } rows[] = {
         {"left to right", U"abc", {0, 1, 2}},
         {"right to left", U"\u05D0\u05D1\u05D2", {2, 1, 0}},
-        {"numbers keep their order", U"\u05D0\u05D1 12", {3, 4, 2, 1, 0}},
         {"the first letter decides about the line", U"ab \u05D0\u05D1", {0, 1, 2, 4, 3}},
         {"and here, too", U"\u05D0 ab", {2, 3, 1, 0}},
-        {"across faces", U"\u05D0<i>\u05D1</i>\u05D2", {9, 4, 0}},
         {"the last Arabic letter is the leftmost", U"\u0628\u0628\u0628", {2, 1, 0}},
         {"lam and alef are one", U"\u0644\u0627", {0}},
         {"marks that are not seen take no room", U"\uFEFFa\u200Bb\r\u200E", {1, 3}},
@@ -71,28 +68,6 @@ TEST_F(Layout, CharactersStandInTheirOrder) {
     const auto glyphs = lay(U"\u05D0(\u05D1)").glyphs;
     ASSERT_EQ(glyphs.size(), 4u);
     EXPECT_EQ(glyphs[0].glyph, faces[0].indexOf(U'(')) << "brackets are mirrored";
-    const auto joined = lay(U"\u0628\u0628\u0628").glyphs, alone = lay(U"\u0628").glyphs;
-    ASSERT_EQ(alone.size(), 1u);
-    for (std::size_t i = 0; i < 3; ++i) {
-        EXPECT_NE(joined[i].glyph, joined[(i + 1) % 3].glyph) << "each place has its form";
-        EXPECT_NE(joined[i].glyph, alone[0].glyph);
-    }
-}
-
-TEST_F(Layout, KerningOnlyDrawsTogether) {
-    const unsigned a = faces[0].indexOf(U'A'), v = faces[0].indexOf(U'V');
-    ASSERT_LT(faces[0].kerning(a, v), 0);
-    const auto pair = lay(U"AV").glyphs;
-    EXPECT_EQ(pair[0].pen, 64);
-    EXPECT_EQ(pair[1].pen - pair[0].pen, faces[0].glyph(a).advance + faces[0].kerning(a, v));
-    EXPECT_EQ(lay(U"AV").width, faces[0].glyph(a).advance / 64 + faces[0].glyph(v).advance / 64);
-    const auto apart = lay(U"A<i>V").glyphs;
-    EXPECT_EQ(apart[1].pen - apart[0].pen, faces[0].glyph(a).advance) << "not between two faces";
-    EXPECT_EQ(faces[0].kerning(0, v), 0) << "nor with a glyph that is unknown";
-    const FontGlyph& first = faces[0].glyph(a);
-    EXPECT_FALSE(first.coverage.empty());
-    EXPECT_EQ(&faces[0].glyph(a), &first) << "drawn once";
-    EXPECT_TRUE(faces[0].glyph(UINT_MAX).coverage.empty());
 }
 
 TEST(TextMask, OutlinesOfOneDotAndOfMore) {
