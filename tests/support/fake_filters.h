@@ -134,8 +134,10 @@ class FakeModule : public QvModule {
     FakeModule(int type, const char* name) : QvModule(type, name, name, nullptr) {}
     QvCodec* create() override {
         auto filter = std::make_unique<Filter>(this);
-        if (std::string(name()) == "frconvert") filter->known.set("_isFramerateConverter", 1);
-        if (std::string(name()) == "bobber") filter->known.set("_rateFactor", 2);
+        if constexpr (requires { filter->known; }) {
+            if (std::string(name()) == "frconvert") filter->known.set("_isFramerateConverter", 1);
+            if (std::string(name()) == "bobber") filter->known.set("_rateFactor", 2);
+        }
         return filter.release();
     }
 };

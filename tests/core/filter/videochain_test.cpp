@@ -1,5 +1,6 @@
 // The plan of the automatic video chain: which filters, in which order, with which parameters.
 #include "builtin/modules.h"
+#include "builtin/pipes/qvvideopipe.h"
 #include "core/filter/jobdescription.h"
 #include "core/filter/qvprocesspipe.h"
 #include "core/filter/qvprocessutil.h"
@@ -97,6 +98,7 @@ TEST_F(VideoChain, OnlyWhatDiffersNeedsAFilter) {
         {{720, 576, p24, 704, 576, Rate::f60i()}, "scaler frconvert:24:30:p1"},
         {{720, 576, Rate::f23p(), 704, 576, Rate::f60i()}, "scaler frconvert:23.976:24 frconvert:24:30:p1"},
         {{720, 576, p24, 704, 576, i59}, "scaler frconvert:24:23.976 frconvert:23.976:29.97:p1"},
+        {{720, 576, Rate(50.0, 1), 720, 576, i50}, "frconvert:50:25"},
         {{720, 576, p24, 704, 576, Rate::f30p()}, "scaler frconvert:24:30"},
         {{720, 576, i50, 704, 576, i59}, "scaler frconvert:25:29.97"},
     };
@@ -127,6 +129,10 @@ TEST_F(VideoChain, DeinterlacerAndCropperChangeTheSizeThatTheScalerSees) {
         Job job(720, 576, i50, 720, 288, p25);
         job.with("deinterlace", stored("deinterlace", AnyDict("deinterlace", method)));
         EXPECT_EQ(job.plan(), std::string("deinterlace") + more);
+        // What it makes is progressive, and can be woven.
+        job.inFramerate = Rate(50.0, 1);
+        job.outFramerate = i50;
+        EXPECT_EQ(job.plan(), std::string("deinterlace") + more + " frconvert:50:25:i1:p0");
     }
     Job job(720, 576, p25, 640, 480, p25);
     job.inFrameAspect = 1.5;
@@ -214,6 +220,31 @@ TEST_F(VideoChain, TellsTheEncoderWhatIsLeftToDo) {
         encoder.video.refused.set("cropMode", 1);
         EXPECT_NO_THROW(adjusted(p25, p25, pipe.get(), encoder));
     }
+}
+
+struct ViewsPipe : QvVf {
+    using QvVf::QvVf;
+    int setParam(const char* name, const Any& value) override {
+        views += Any(name) == "nrViews" ? value.asInt32() : 0;
+        job = Any(name) == "jobDescription" ? value.asGeneric() : job;
+        return 0;
+    }
+    int views = 0;
+    const void* job = nullptr;
+};
+
+TEST_F(VideoChain, PicturesOfSeveralViewsHaveAPipeOfTheirOwn) {
+    plugin_.add(new FakeModule<ViewsPipe>(QvModuleType::videoPipe, "mvprocess"));
+    Job job(720, 576, p25, 704, 576, p25);
+    for (const int views : {0, 1, 2, 5}) {
+        const Pipe pipe(QvProcessUtil::createVideoPipeMV(job, views));
+        const auto* own = dynamic_cast<ViewsPipe*>(pipe.get());
+        ASSERT_EQ(own != nullptr, views > 1);
+        EXPECT_TRUE(!own || (own->views == views && own->job == &job));
+        EXPECT_EQ(pipe->filter(0)->getState(), 3);
+    }
+    job.with("customFilters", AnyVector(Any(stored("logo", AnyDict("refuseOpen", -1)))));
+    EXPECT_EQ(QvProcessUtil::createVideoPipeMV(job, 2), nullptr) << "it does not open";
 }
 
 TEST(VideoChainWithout, AMissingConverterIsNamed) {
