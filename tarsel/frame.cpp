@@ -97,6 +97,7 @@ void frame(Given& given) {
         throw Failure(Exit::input, inQuotes(given.input) + " has no picture");
     source.selectAll();
     PictureReader reader(source, given.effects);
+    if (reader.pipe()) checkFilterFiles(*reader.pipe(), {given.input}, given.outputs.get(), given.overwrite);
     if (!given.sheet.empty()) return saveSheet(reader, given);
     const auto rate = source.frameRate();
     const MediaTime at = given.at.empty() ? MediaTime(0LL, kTicks) : parseTime(given.at, rate, "--at");

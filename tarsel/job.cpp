@@ -326,6 +326,7 @@ void Job::planPicture(JobStream& stream) const {
     const FiltersState state = stream.picture->filters(stream.expected, false);
     if (!state.empty()) stream.params.setFilters(state);
     const auto pipe = tryPipe(stream.picture->job(state));
+    if (pipe) checkFilterFiles(*pipe, options_.inputs, outputs_.get(), options_.overwrite);
     stream.chain = describe(pipe.get());
 }
 

@@ -4,6 +4,7 @@
 #include <condition_variable>
 #include <cstdio>
 #include <mutex>
+#include <optional>
 
 #include "job.h"
 #include "keyboard.h"
@@ -60,12 +61,17 @@ class Job::Runner : public QvTranscoder {
         if (isPaused()) unpause();
     }
 
-    // Why the run failed: a link knows it better than the run.
+    // Why the run failed: a link knows it better than the log, and that better than the run.
     std::string reason() const {
         for (const JobStream& stream : job_.streams_)
             if (const TransLink* link = getLinkForOutput(stream.type, stream.encStream);
-                link && link->errorCode() != 0)
+                link && link->errorCode() != 0 && *link->errorDesc())
                 return link->errorDesc();
+        AnyVector messages;
+        qv_log()->getAll(messages);
+        for (int i = 0; i < messages.size(); ++i)
+            if (messages.at(i).asDict().getInt32("type", 0) == kErrorLine)
+                return messages.at(i).asDict().getString("text", "");
         return *errorDesc() ? errorDesc() : "the job failed; --log FILE tells more";
     }
 
@@ -90,7 +96,7 @@ class Job::Runner : public QvTranscoder {
     }
     const ProgressState& last() const { return last_; }
     // Why a filter could not do its work; the others went on without it.
-    const std::string& filterFailure() const { return filterFailure_; }
+    const std::optional<Failure>& filterFailure() const { return filterFailure_; }
 
   private:
     void takeFilterFailure() {
@@ -100,17 +106,24 @@ class Job::Runner : public QvTranscoder {
             if (!link || stream.type != 1 || !filters.isDict()) continue;
             for (const Any& name : FiltersState(filters.asDict()).names(true))
                 for (int i = 0; const QvCodec* filter = link->filter(name.asString(""), i); ++i)
-                    if (filter->errorCode() != 0 && filterFailure_.empty())
-                        filterFailure_ = std::string(filter->name()) + ": " + inLine(filter->errorDesc());
+                    if (filter->errorCode() != 0 && !filterFailure_) filterFailure_ = failureOf(*filter);
         }
     }
 
+    static Failure failureOf(const QvCodec& filter) {
+        const bool writes = !filterFile(filter, QV_GUI_FILESELECT_SAVE).empty();
+        return {writes ? Exit::output : Exit::failed, "the filter " + std::string(filter.name()) + ": " +
+                                                          inLine(filter.errorDesc()) +
+                                                          (writes ? "" : "; nothing was left behind")};
+    }
+
     static constexpr auto kSlowStop = std::chrono::seconds(1);
+    static constexpr int kErrorLine = 2;  // type of a message
 
     Job& job_;
     Progress& progress_;
     ProgressState last_;
-    std::string filterFailure_;
+    std::optional<Failure> filterFailure_;
     std::atomic<bool> stop_{false};
     std::mutex lock_;
     std::condition_variable changed_;
@@ -172,8 +185,7 @@ void Job::run() {
         const int result = runLinked(runner, progress);
         if (const Exit signalled = signals_.received(); signalled != Exit::done) stopped(signalled);
         if (result != 0 && result != QvStatus::endOfStream) fail(runner);
-        if (!runner.filterFailure().empty())
-            throw Failure(Exit::failed, "the filter " + runner.filterFailure() + "; nothing was left behind");
+        if (runner.filterFailure()) throw *runner.filterFailure();
         takeWarnings();
         checkResult();
         if (outputs_) names = outputs_->commit("raw");
@@ -190,8 +202,8 @@ void Job::stopped(Exit signalled) const {
                                     : "stopped; nothing was left behind");
 }
 
-// The reason stands in the object that failed: a decoder, a link, or one of the output's members, where the
-// file knows what the system said. What the user log has is less exact.
+// The reason stands in the object that failed: a decoder, one of the output's members, where the file knows
+// what the system said, a filter, or a link.
 void Job::fail(Runner& runner) const {
     for (const auto& source : sources_)
         if (source->decoder().errorCode() < 0 && source->decoder().errorCode() != QvStatus::endOfStream)
@@ -208,14 +220,12 @@ void Job::fail(Runner& runner) const {
     take(pipe_->getMuxer());
     take(pipe_->sink());
     take(pipe_.get());
-    AnyVector messages;
-    qv_log()->getAll(messages);
-    for (int i = 0; i < messages.size() && reason.empty(); ++i)
-        if (messages.at(i).asDict().getInt32("type", 0) == 2)
-            reason = messages.at(i).asDict().getString("text", "");
-    if (reason.empty() || !outputs_) throw Failure(Exit::failed, inLine(runner.reason()));
-    throw Failure(Exit::output, "can't write " + inQuotes(outputs_->output().string()) + ": " +
-                                    inLine(outputs_->withFinalNames(reason)));
+    if (!reason.empty() && outputs_)
+        throw Failure(Exit::output, "can't write " + inQuotes(outputs_->output().string()) + ": " +
+                                        inLine(outputs_->withFinalNames(reason)));
+    if (runner.filterFailure()) throw *runner.filterFailure();
+    reason = runner.reason();
+    throw Failure(Exit::failed, inLine(outputs_ ? outputs_->withFinalNames(reason) : reason));
 }
 
 void Job::showWarnings() const {

@@ -121,7 +121,7 @@ Outputs::Outputs(const std::string& output, const std::string& option, const std
     if (folderOf(output_).string().find('\\') != std::string::npos)
         refuse(output_, "a backslash can't stand in the name of the folder");
     if (fs::is_directory(output_, error)) refuse(output_, "this is a folder; give a file name in it");
-    checkFolder(output_);
+    if (!device_) checkFolder(output_);
     checkFinal(output_);
 }
 

@@ -3,11 +3,14 @@
 #include <algorithm>
 #include <charconv>
 #include <cstring>
+#include <filesystem>
 
 #include "failure.h"
 #include "keyvalues.h"
 #include "overlays.h"
 #include "timespec.h"
+
+namespace fs = std::filesystem;
 
 namespace {
 
@@ -273,9 +276,9 @@ VideoJobDescription PictureEffects::job(const FiltersState& filters) const {
 
 namespace {
 
-// Opens a filter for a moment. The dump makes its file then, so it has to wait for the run.
+// Opens a filter for a moment. One that writes a file would make it then, so it has to wait for the run.
 void tryFilter(QvVideoFilter& filter) {
-    if (std::strcmp(filter.name(), "rawdump") == 0) return;
+    if (!filterFile(filter, QV_GUI_FILESELECT_SAVE).empty()) return;
     int result = QvStatus::failed;
     std::string reason;
     try {
@@ -287,7 +290,7 @@ void tryFilter(QvVideoFilter& filter) {
     }
     if (result == QvStatus::ok) return;
     const std::string_view name = filter.name();
-    const bool reads = name == "logo" || name == "animatedlogo" || name == "subtitle";
+    const bool reads = !filterFile(filter, QV_GUI_FILESELECT_LOAD).empty();
     throw Failure(reads ? Exit::input : Exit::usage,
                   "the filter " + std::string(name) + " can't be used: " + inLine(reason));
 }
@@ -327,6 +330,40 @@ void addSettings(const AnyDict& state, const AnyDict& initial, std::string& line
 }
 
 }  // namespace
+
+std::string filterFile(const QvCodec& filter, int guiControl) {
+    const Any set = filter.getParam("paramSet");
+    for (int i = 0; set.isVector() && i < set.asVector().size(); ++i) {
+        const AnyDict& described = set.asVector().at(i).asDict();
+        if (described.getInt32("guiControl", 0) != guiControl) continue;
+        const Any value = filter.getParam(described.getString("name", "")).toString();
+        if (*value.asString("")) return value.asString("");
+    }
+    return "";
+}
+
+void checkFilterFiles(const QvVProcessPipe& pipe, const std::vector<std::string>& inputs,
+                      const Outputs* outputs, bool overwrite) {
+    const auto checkOutput = [&](const std::string& name, const char* what) {
+        std::error_code error;
+        if (outputs && !outputs->isDevice() &&
+            fs::weakly_canonical(name, error) == fs::weakly_canonical(outputs->output(), error))
+            throw Failure(Exit::output, "can't write " + inQuotes(name) + ": it is also " + what);
+    };
+    std::vector<std::string> read = inputs;
+    for (int i = 0; i < pipe.nrFilters(); ++i)
+        if (const auto name = filterFile(*pipe.filter(i), QV_GUI_FILESELECT_LOAD); !name.empty()) {
+            checkOutput(name, "an input");
+            read.push_back(name);
+        }
+    for (int i = 0; i < pipe.nrFilters(); ++i) {
+        const QvCodec& filter = *pipe.filter(i);
+        const std::string name = filterFile(filter, QV_GUI_FILESELECT_SAVE);
+        if (name.empty()) continue;
+        const Outputs checked(name, std::string("--filter ") + filter.name(), read, overwrite);
+        checkOutput(name, "the output of the job");
+    }
+}
 
 std::unique_ptr<QvVProcessPipe> tryPipe(const VideoJobDescription& job) {
     std::unique_ptr<QvVProcessPipe> pipe;

@@ -8,6 +8,7 @@
 #include <qvplugcore/qvplugcore.h>
 
 #include "effects.h"
+#include "outputs.h"
 #include "source.h"
 
 struct PictureFormat {
@@ -54,6 +55,15 @@ class PictureEffects {
 int filterType(const std::string& spec);
 // The stored state of the filter that --filter describes, switched on.
 AnyDict filterState(const std::string& spec);
+
+// The first file that a filter has been given to read (QV_GUI_FILESELECT_LOAD) or to write (..._SAVE), as its
+// descriptions of parameters say; empty without one.
+std::string filterFile(const QvCodec& filter, int guiControl);
+
+// That what filters read is not overwritten by `outputs` (null: there is none), and what they write is
+// neither an input nor an output and, unless `overwrite`, does not exist. Throws Failure.
+void checkFilterFiles(const QvVProcessPipe& pipe, const std::vector<std::string>& inputs,
+                      const Outputs* outputs, bool overwrite);
 
 // The pipe of a job, null if it has nothing to do. Each filter has been tried, so that what fails later fails
 // by chance. Throws Failure.

@@ -16,6 +16,10 @@ PictureReader::PictureReader(Source& source, const EffectOptions& options)
     if (!options.any()) return;
     frames_ = QvRatio::multyplyByRatio(inFrames_, effects_.out().rate.rate(), effects_.in().rate.rate());
     pipe_ = tryPipe(effects_.job(effects_.filters(frames_, true)));
+    for (int i = 0; pipe_ && i < pipe_->nrFilters(); ++i)
+        if (!filterFile(*pipe_->filter(i), QV_GUI_FILESELECT_SAVE).empty())
+            throw Failure(Exit::usage, std::string("--filter ") + pipe_->filter(i)->name() +
+                                           ": it writes a file, and single pictures are no run");
     if (pipe_) reopen();
 }
 

@@ -10,6 +10,7 @@ class PictureReader {
     // Throws Failure, as its operations do.
     PictureReader(Source& source, const EffectOptions& options);
     ~PictureReader();
+    const QvVProcessPipe* pipe() const { return pipe_.get(); }  // null without filters
 
     const PictureFormat& format() const { return effects_.out(); }
     long long frames() const { return frames_; }  // that a run would write

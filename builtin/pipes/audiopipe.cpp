@@ -62,7 +62,13 @@ int QvAf::open() {
 
 int QvAf::close() {
     int result = QvStatus::ok;
-    for (const auto& member : filters_) result |= member.filter->close();
+    for (const auto& member : filters_) {
+        const auto& filter = *member.filter;
+        const int closed = member.filter->close();
+        if (closed != QvStatus::ok && result == QvStatus::ok)
+            setError(closed, "%s: %s", filter.name(), *filter.errorDesc() ? filter.errorDesc() : "it failed");
+        result |= closed;
+    }
     setState(stateInitialised);
     output_.destroy();
     outputInited_ = false;

@@ -46,6 +46,7 @@ int QvVf::open() {
     }
     formGroups();
     setState(stateOpen);
+    setError(QvStatus::ok);
     framesIn_ = 0;
     framesOut_ = 0;
     held_.frameNr = -1;
@@ -75,10 +76,17 @@ void QvVf::logGroups() const {
 
 int QvVf::close() {
     int result = QvStatus::ok;
-    for (const auto& filter : filters_) result |= filter->close();
+    for (const auto& filter : filters_) result |= noted(filter->close(), *filter);
     held_.destroy();
     setState(stateInitialised);
     groups_.clear();
+    return result;
+}
+
+// Frames go on without what a filter should have done to them: the first failure stays to be asked for.
+int QvVf::noted(int result, const QvVideoFilter& filter) {
+    if (result != QvStatus::ok && result != QvStatus::warning && errorCode() == QvStatus::ok)
+        setError(result, "%s: %s", filter.name(), *filter.errorDesc() ? filter.errorDesc() : "it failed");
     return result;
 }
 
@@ -87,14 +95,14 @@ int QvVf::applyMembers(const Group& group) {
     int result = QvStatus::ok;
     if (group.size() == 1 || group.front()->ready() <= 0) return result;
     QvFrame& frame = *group.front()->frame();
-    for (std::size_t i = 1; i < group.size(); ++i) result |= group[i]->apply(frame);
+    for (std::size_t i = 1; i < group.size(); ++i) result |= noted(group[i]->apply(frame), *group[i]);
     return result;
 }
 
 int QvVf::give(const Group& group, QvFrame& frame) {
     // A head with an unread frame would lose it.
     if (group.front()->ready() > 0) qvAssertFail("builtin/qvvideopipe(362)", nullptr);
-    const int result = group.front()->write(frame);
+    const int result = noted(group.front()->write(frame), *group.front());
     return result | applyMembers(group);
 }
 

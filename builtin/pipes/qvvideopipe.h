@@ -1,6 +1,9 @@
 // The video processing pipe (module "vprocess"): a row of filters through which frames are moved, from the
 // end of the chain forward, so that at most one frame a group is under way.
 //
+// A filter that fails to write, apply or close does not stop the others. The first such failure since open is
+// the pipe's errorCode and errorDesc, with the filter's name, until it is opened again.
+//
 // A group is a head, which is written to and produces frames, and the filters behind it that work in place on
 // each frame that leaves the head.
 #pragma once
@@ -48,8 +51,9 @@ class QvVf : public QvVProcessPipe {
     bool validPosition(int position) const;
     void formGroups();
     void logGroups() const;
-    static int applyMembers(const Group& group);
-    static int give(const Group& group, QvFrame& frame);
+    int noted(int result, const QvVideoFilter& filter);
+    int applyMembers(const Group& group);
+    int give(const Group& group, QvFrame& frame);
     std::size_t lastReadyGroup() const;
     void handOver(std::size_t group);
 

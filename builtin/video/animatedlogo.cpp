@@ -163,9 +163,10 @@ int AnimatedLogo::close() {
 // False: the movie has no further frame.
 bool AnimatedLogo::readNext() {
     int result = movie_->readFrame(0);
-    if (result == QvStatus::endOfStream && settings_.loop && picture_ &&
-        movie_->seekToFrame(0, 0) == QvStatus::ok)
-        result = movie_->readFrame(0);
+    if (result == QvStatus::endOfStream && settings_.loop && picture_) {
+        result = movie_->seekToFrame(0, 0);
+        if (result == QvStatus::ok) result = movie_->readFrame(0);
+    }
     if (result != QvStatus::ok && result != QvStatus::endOfStream)
         qv_log()->warning("The logo movie %s can't be read on: %s", settings_.filename.c_str(),
                           movie_->errorDesc());

@@ -1,5 +1,7 @@
 #include "builtin/video/dumpraw.h"
 
+#include <cstring>
+
 #include "builtin/creators.h"
 #include "core/arch/platform.h"
 #include "core/engine/qvlog.h"
@@ -8,10 +10,7 @@
 namespace {
 
 constexpr QvParamRow<DumpRawSettings> rows[] = {
-    {.name = "filename",
-     .member = &DumpRawSettings::filename,
-     .flags = qvParamStored,
-     .description = "Raw filename"},
+    {.name = "filename", .member = &DumpRawSettings::filename, .flags = qvParamStored},
 };
 static_assert(qvParamTableOk<DumpRawSettings>(rows));
 
@@ -26,9 +25,20 @@ int DumpRaw::open() {
     file_.reset();
     failed_ = false;
     if (name != DumpRawSettings().filename) file_.reset(qv_platform().openFile(name.c_str(), "wb"));
-    if (file_) return InPlaceEffectOf::open();
+    if (file_) {
+        // A frame is written as a whole: what fails is told with the frame and not later.
+        std::setvbuf(file_.get(), nullptr, _IONBF, 0);
+        return InPlaceEffectOf::open();
+    }
     qv_dbg()->error("Raw dumper, failed to open %s, exiting.", name.c_str());
+    if (name == DumpRawSettings().filename) return setError(QvStatus::failed, "'filename' names no file");
     return setError(QvStatus::failed, "the file %s of the raw dump can't be written", name.c_str());
+}
+
+void DumpRaw::getParam(const char* name, Any& value) const {
+    if (std::strcmp(name, "paramSet") != 0) return InPlaceEffectOf::getParam(name, value);
+    value = AnyVector(
+        Any(QvProcessUtil::createParamDesc("filename", Any::String, QV_GUI_FILESELECT_SAVE, "Raw filename")));
 }
 
 int DumpRaw::close() {

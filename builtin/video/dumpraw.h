@@ -21,10 +21,13 @@ struct DumpRawSettings {
 class DumpRaw : public InPlaceEffectOf<DumpRawSettings> {
   public:
     DumpRaw();
+    void getParam(const char* name, Any& value) const override;
     int open() override;
     int close() override;
     int write(QvFrame& frame) override;
     int apply(QvFrame& frame) override;
+
+    using InPlaceEffectOf::getParam;
 
   protected:
     int change(const QvFrame& from, QvFrame& to) override;

@@ -118,6 +118,19 @@ int setBox(Settings& settings, const Any& value) {
 
 void getBox(const Settings& settings, Any& value) { value = settings.geometry.box; }
 
+// A state says whether its box is one that somebody chose: otherwise it is no more than that of the input at
+// that time. States of other makers don't say, and mean their box.
+int setChosen(Settings& settings, const Any& value) {
+    bool chosen = true;
+    if (!qvparam::convert(value, chosen)) return QvStatus::invalidParam;
+    if (chosen) return QvStatus::ok;
+    settings.geometry.placed = false;
+    settings.geometry.fit();
+    return QvStatus::ok;
+}
+
+void getChosen(const Settings& settings, Any& value) { value = settings.geometry.placed ? 1 : 0; }
+
 int reset(Settings& settings, const Any&) {
     settings.geometry.reset();
     return QvStatus::ok;
@@ -140,6 +153,7 @@ constexpr QvParamRow<Settings> rows[] = {
     {"mode", Access{setMode, getMode}, qvParamStored},
     {"cropAspect", Access{setAspect<&Geometry::cropAspect>, getCropAspect}, qvParamStored},
     {"cropBox", Access{setBox, getBox}, qvParamStored},
+    {"boxChosen", Access{setChosen, getChosen}, qvParamStored},
     {"padTop", Access{setPad<&CropPads::top>, getPad<&CropPads::top>}, qvParamStored},
     {"padBottom", Access{setPad<&CropPads::bottom>, getPad<&CropPads::bottom>}, qvParamStored},
     {"padLeft", Access{setPad<&CropPads::left>, getPad<&CropPads::left>}, qvParamStored},
@@ -193,11 +207,22 @@ int QvCrop::setState(const Any& value) {
     return QvStatus::ok;
 }
 
-void QvCrop::getParam(const char* name, Any& value) const {
-    if (std::strcmp(name, "state") != 0) return VideoEffectOf::getParam(name, value);
+AnyDict QvCrop::state() const {
     AnyDict state;
     qvStoreParamRows<CropSettings>(rows, settings_, state);
-    value = state;
+    // Nobody has said what the aspect is: another input has its own.
+    if (settings_.geometry.inputAspect <= 0) state.remove("inFrameAspect");
+    return state;
+}
+
+void QvCrop::getParam(const char* name, Any& value) const {
+    if (std::strcmp(name, "state") != 0) return VideoEffectOf::getParam(name, value);
+    value = state();
+}
+
+void QvCrop::store(AnyDict& dict) const {
+    VideoEffectOf::store(dict);
+    dict.set("state", state());
 }
 
 int QvCrop::open() {

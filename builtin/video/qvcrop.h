@@ -17,7 +17,9 @@
 //     "cropBox" (Rect)               whole  all of it, as it stands
 //     "padTop", "padBottom", "padLeft", "padRight"  0  pixels to 16384; without effect unless in mode 1
 //     "reset" (set only)                    the whole input, as far as the mode allows, without pads
-//     "state" (Dict)                        box, mode, aspects and pads at once; all or nothing
+//     "state" (Dict)                        box, mode, aspects and pads at once; all or nothing. Its
+//                                           "boxChosen" 0 says that the box is that of the input and follows
+//                                           another one; without an input aspect that was set it has none
 //
 // and to read "outputWidth", "outputHeight" and the limits "minWidth", "maxWidth", "minHeight", "maxHeight"
 // (of "cropWidth" and "cropHeight", with the corner where it is) and "minX", "maxX", "minY", "maxY" (of the
@@ -44,6 +46,7 @@ class QvCrop : public VideoEffectOf<CropSettings> {
     QvCrop();
     int setParam(const char* name, const Any& value) override;
     void getParam(const char* name, Any& value) const override;
+    void store(AnyDict& dict) const override;
     int open() override;
 
     using VideoEffectOf::getParam;
@@ -52,6 +55,7 @@ class QvCrop : public VideoEffectOf<CropSettings> {
     int fill(const QvFrame& frame) override;
 
   private:
+    AnyDict state() const;
     int setState(const Any& value);
     int prepare(const QvFrame& frame);
 

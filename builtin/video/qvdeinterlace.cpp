@@ -1,9 +1,13 @@
 #include "builtin/video/qvdeinterlace.h"
 
+#include <algorithm>
 #include <array>
 
 #include "builtin/creators.h"
+#include "builtin/video/samplelayout.h"
+#include "core/media/pixelkernels_p.h"
 #include "core/media/qvgeometry.h"
+#include "core/media/rows_p.h"
 
 namespace {
 
@@ -40,6 +44,30 @@ constexpr QvParamRow<DeinterlaceSettings> rows[] = {
 };
 static_assert(qvParamTableOk<DeinterlaceSettings>(rows));
 
+// Operations on frames take I422 for a format with half as many rows of chroma as of luma.
+void finishChroma(QvFrame& to, const QvFrame& from, int method) {
+    if (to.four_cc() != QvFourcc::I422) return;
+    const int rows = to.height();
+    for (int p = 1; p < 3; ++p) {
+        const std::ptrdiff_t in = from.stride(p), out = to.stride(p), bytes = std::min(in, out);
+        unsigned char* target = to.plane(p);
+        const unsigned char* source = from.plane(p);
+        const int pairs = rows / 2;
+        switch (method) {
+            case top: qvrows::copy(target, out, source, 2 * in, bytes, rows); break;
+            case bottom: qvrows::copy(target, out, source + in, 2 * in, bytes, rows); break;
+            case bob:
+                for (int y = 0; y < rows; ++y, target += out, source += 2 * in)
+                    qvpixels::averageBytes(target, source, source + in, static_cast<size_t>(bytes));
+                break;
+            default:
+                qvrows::copy(target, 2 * out, source + in, 2 * in, bytes, pairs);
+                qvrows::copy(target + out, 2 * out, source, 2 * in, bytes, pairs);
+                qvrows::copy(target + out * 2 * pairs, out, source + in * 2 * pairs, in, bytes, rows % 2);
+        }
+    }
+}
+
 }  // namespace
 
 QvCodec* newDeinterlace() { return new QvDeinterlace; }
@@ -47,11 +75,22 @@ QvCodec* newDeinterlace() { return new QvDeinterlace; }
 QvDeinterlace::QvDeinterlace() : VideoEffectOf("deinterlace", rows) {}
 
 int QvDeinterlace::fill(const QvFrame& frame) {
-    switch (settings_.method) {
-        case top: return output_.copyDeinterlaced(frame, true);
-        case bottom: return output_.copyDeinterlaced(frame, false);
-        case reverse: return output_.copySwitched(frame);
-        case bob: return output_.copyBob(frame);
-        default: return output_.copy(frame);
+    const int method = settings_.method;
+    int result = QvStatus::ok;
+    switch (method) {
+        case top: result = output_.copyDeinterlaced(frame, true); break;
+        case bottom: result = output_.copyDeinterlaced(frame, false); break;
+        case reverse: result = output_.copySwitched(frame); break;
+        case bob: result = output_.copyBob(frame); break;
+        default: result = takeShape(output_, frame);
     }
+    if (result != QvStatus::ok)
+        return setError(result, "no memory for a frame of %dx%d", frame.width(), frame.height());
+    if (method == keep) {
+        copySamples(output_, frame);
+        output_.copyMeta(frame);
+    } else {
+        finishChroma(output_, frame, method);
+    }
+    return QvStatus::ok;
 }

@@ -113,6 +113,7 @@ AnyVector paramSet() {
     set.append(desc("font_size", Any::Int32, QV_GUI_EDIT, "Font size in pixels", 1, largestFont));
     set.append(desc("speed", Any::Float, QV_GUI_EDIT, "Relative subtitle speed", 0.0, mostSpeed));
     set.append(desc("delay", Any::Float, QV_GUI_EDIT, "Subtitle offset in ms", -mostDelay, mostDelay));
+    set.append(desc("framerate", Any::Float, QV_GUI_EDIT, "Framerate"));
     set.append(QvProcessUtil::createParamDesc("encoding", Any::Int32, QV_GUI_COMBOBOX, "",
                                               identifiers(encodingRange())));
     set.append(QvProcessUtil::createParamDesc("fontEffect", Any::Int32, QV_GUI_COMBOBOX, "",

@@ -12,8 +12,10 @@ bool VideoEffect::opened() const { return getState() == stateOpen; }
 
 bool VideoEffect::acceptsState(const AnyDict& dict) const {
     const Any& state = dict.get("state");
-    if (dict.get("name") == name() && (!state.isValid() || state.isDict())) return true;
+    const Any& owner = dict.get("name");
+    if (owner == name() && (!state.isValid() || state.isDict())) return true;
     qv_dbg()->write("[%s] restore - invalid dict", tag_);
+    if (owner != name()) qv_dbg()->write("Invalid state dict, module name is %s", owner.asString("n/a"));
     return false;
 }
 

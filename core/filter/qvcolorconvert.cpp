@@ -1,5 +1,6 @@
 #include "core/filter/qvcolorconvert.h"
 
+#include <algorithm>
 #include <cstdint>
 #include <cstring>
 
@@ -9,6 +10,7 @@
 #include "core/filter/qvfilter.h"
 #include "core/filter/srscaler.h"
 #include "core/media/qvframe.h"
+#include "core/media/rows_p.h"
 #include "core/value/qvassert.h"
 
 namespace {
@@ -37,6 +39,15 @@ void reversePixels(const QvFrame& in, QvFrame& out) {
             std::memcpy(to + 4 * x, &pixel, 4);
         }
     }
+}
+
+// Assigning a frame leaves the lower half of the chroma of I422 as it was.
+void assign(QvFrame& to, const QvFrame& from) {
+    to = from;
+    if (!to.inited() || to.four_cc() != QvFourcc::I422) return;
+    for (int p = 1; p < 3; ++p)
+        qvrows::copy(to.plane(p), to.stride(p), from.plane(p), from.stride(p),
+                     std::min(to.stride(p), from.stride(p)), to.height());
 }
 
 QvScalePicture pictureOf(const QvFrame& frame) {
@@ -112,7 +123,7 @@ int QvColorConverter::convert(const QvFrame& in, QvFrame& out) {
         return result;
     }
     QV_ASSERT(filter->ready() > 0);
-    out = *filter->frame();
+    assign(out, *filter->frame());
     filter->next();
     return QvStatus::ok;
 }

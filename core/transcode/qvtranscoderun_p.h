@@ -51,7 +51,7 @@ class QvTranscodeRun {
     int analyze();
 
     static int totalFrames(const QvTask& task, double& rate);
-    static void closeLinks(const QvTask& task);
+    static int closeLinks(const QvTask& task);  // closes all of them; their results joined by bits
 
   private:
     int breakOff();

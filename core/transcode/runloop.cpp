@@ -120,7 +120,8 @@ int QvTranscodeRun::finish(int result) {
     const bool ended = endOfVideo_ && result == QvStatus::endOfStream;
     if (ended) result = QvStatus::ok;
     if (p_.closeEncoder) result = closeOutput(result);
-    closeLinks(*p_.task);
+    const int closed = closeLinks(*p_.task);
+    if (result == QvStatus::ok) result = closed;
     p_.metadataFiles.clear();
     int told = ended ? QvStatus::endOfStream : kStopped;
     if (result != QvStatus::ok) {

@@ -130,9 +130,11 @@ int QvTranscodeRun::seekInputs() {
     return QvStatus::ok;
 }
 
-void QvTranscodeRun::closeLinks(const QvTask& task) {
+int QvTranscodeRun::closeLinks(const QvTask& task) {
+    int result = QvStatus::ok;
     const auto links = task.links();
-    for (int i = 0; i < links.size(); ++i) links.at(i)->close();
+    for (int i = 0; i < links.size(); ++i) result |= links.at(i)->close();
+    return result;
 }
 
 int QvTranscodeRun::totalFrames(const QvTask& task, double& rate) {

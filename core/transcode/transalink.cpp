@@ -187,6 +187,7 @@ void TransALink::setupSmartRender(const AnyDict* params) {
 
 int TransALink::close() {
     if (!opened_) return QvStatus::ok;
+    const int result = audioPipe_ ? closePipe(*audioPipe_) : QvStatus::ok;
     audioPipe_.reset();
     qv_dbg()->debug("ALink @ %p: closed, %lld samples written", static_cast<void*>(this), processed_ + 1);
     for (const Any& stream : selectedStreams_) decoder_->deselect(qvAudioStream, stream.toInt32());
@@ -197,7 +198,7 @@ int TransALink::close() {
     silence_.destroy();
     muxBuffer_.destroy();
     opened_ = false;
-    return QvStatus::ok;
+    return result;
 }
 
 int TransALink::totalOutFrames() const { QV_FAIL_PLAIN(); }

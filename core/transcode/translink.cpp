@@ -118,6 +118,14 @@ int TransLink::pipeFailed(const QvException& failure) {
     return setError(QvStatus::failed, text ? text + 1 : failure.what());
 }
 
+// What failed before is the reason of the failure, if anything did.
+int TransLink::closePipe(QvCodec& pipe) {
+    const int closed = pipe.close();
+    const int result = closed != QvStatus::ok ? closed : pipe.errorCode();
+    if (result != QvStatus::ok && errorCode_ == QvStatus::ok) setError(result, pipe.errorDesc());
+    return result;
+}
+
 void TransLink::nameStreams() {
     const char* kind = type() == qvVideoStream ? "video%d" : "audio%d";
     decStreamName_ = Any::sprintf(kind, decStreamNr_);

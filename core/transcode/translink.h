@@ -40,7 +40,8 @@ class QV_API TransLink {
     // "chapters", "effects", "audioEffects", "connMatrix", "smartRender", "qualityStats". -1 when open
     // already.
     virtual int open(const AnyDict* params) = 0;
-    // Ends the run; 0. A closed link is left alone.
+    // Ends the run. A closed link is left alone: 0. Otherwise 0 or what a filter failed with since open, here
+    // or before: filters let frames pass that they could not work on, and no step tells.
     virtual int close() = 0;
     // One step: a frame for video, exactly n samples for audio. The status of the writer, or of the reader
     // when it failed before the expected end.
@@ -83,6 +84,7 @@ class QV_API TransLink {
     Any _encPar(const char* name) const;  // "video0/NAME": a parameter of this stream on the encoder pipe
     int setError(int code, const Any& text);
     int pipeFailed(const QvException& failure);  // why a conversion can't be built, as this link's error
+    int closePipe(QvCodec& pipe);                // 0, or what failed in it, as this link's error
     void copyError(int code, const Any& text);
     void nameStreams();
     void readLogProgress();

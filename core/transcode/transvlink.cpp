@@ -272,11 +272,12 @@ int TransVLink::close() {
     if (!opened_) return QvStatus::ok;
     writeLog();
     psnrLogger_.reset();
+    const int result = videoPipe_ ? closePipe(*videoPipe_) : QvStatus::ok;
     releasePipe();
     qv_dbg()->debug("VLink @ %p: closed, %d frames written", static_cast<void*>(this), framesWritten_);
     framesWritten_ = -1;
     opened_ = false;
-    return QvStatus::ok;
+    return result;
 }
 
 double TransVLink::completed() const {

@@ -2,6 +2,7 @@
 #include "core/decode/qvdecoder.h"
 #include "core/encode/qvencodepipe.h"
 #include "core/engine/optionalparam_p.h"
+#include "core/engine/qvexception.h"
 #include "core/engine/qvfileutil.h"
 #include "core/engine/qvmodule.h"
 #include "core/engine/qvregistry.h"
@@ -58,7 +59,12 @@ void TransVLink::smartStep(Step& step) {
 void TransVLink::pipeStep(Step& step) {
     if (videoPipe_->ready() == 0) {
         QV_STEP_LOG("VLink", "vprocess...");
-        step.read = _processOneFrame();
+        try {
+            step.read = _processOneFrame();
+        } catch (const QvAssertFailure& failure) {
+            pipeFailed(failure);
+            throw;
+        }
         QV_STEP_LOG("VLink", "vprocess done, result=%d", step.read);
         if (step.read == QvStatus::endOfStream) {
             qv_dbg()->debug("VLink @ %p: End of input stream", static_cast<void*>(this));

@@ -49,7 +49,7 @@ class AnyParamFilter : public Base {
     int close() override {
         ++closed;
         this->setState(QvCodec::stateInitialised);
-        return 0;
+        return known.getInt32("refuseClose", 0);
     }
 
     AnyDict known;
@@ -70,7 +70,7 @@ class FakeVideoFilter : public AnyParamFilter<QvVideoFilter> {
     }
     int apply(QvFrame& frame) override {
         applied.push_back(frame.frameNr);
-        return 0;
+        return known.getInt32("refuseApply", 0);
     }
     bool applySupported() const override { return inPlace; }
     int ready() const override { return left; }

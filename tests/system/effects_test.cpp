@@ -267,6 +267,54 @@ TEST_F(Effects, WhatCanNotBeDoneIsTold) {
               {std::string(option).substr(0, std::string(option).find('=')), "no picture"});
 }
 
+TEST_F(Effects, AFilterThatFailsFailsTheJob) {
+    const Words job{"transcode", "testgen:size=64x48,duration=0.4,audio=0"};
+    const Words toI422{"--pixel", "I422", "--filter", "scaler:outWidth=64,outHeight=48,FOURCC=I422,_front=1"};
+    folder.write("precious", "precious");
+    makeOverlays();
+    const struct {
+        int status;
+        Words options;
+        std::vector<std::string> parts;
+    } cases[] = {
+        {4, {"--filter", "rawdump:filename=/dev/full", "-o", "x.avi"}, {"rawdump", "/dev/full"}},
+        {4, {"--filter", "rawdump:filename=/dev/full", "--muxer", "nullmux"}, {"rawdump", "/dev/full"}},
+        {4, {"--filter", "rawdump:filename=no/x", "-o", "x.avi"}, {"'no/x'", "'no' does not exist"}},
+        {4, {"--filter", "rawdump:filename=precious", "-o", "x.avi"}, {"'precious'", "exists"}},
+        {1, {"--filter", "rawdump", "-o", "x.avi"}, {"rawdump", "names no file"}},
+        {4, {"--filter", "rawdump:filename=x.avi", "-o", "x.avi"}, {"'x.avi'", "output"}},
+        {4, {"--filter", "logo:filename=l.png", "-o", "l.png", "-y"}, {"'l.png'", "input"}},
+        {1, toI422 + Words{"--filter", "timecode:_front=1", "-o", "x.raw"}, {"timecode", "I422"}},
+        {1,
+         toI422 + Words{"--filter", "brightness:gamma=2,_front=1", "-o", "x.raw"},
+         {"unknown colorspace in brightness filter"}},
+    };
+    for (const auto& c : cases) fails(c.status, job + c.options, c.parts);
+    makeYuv("clip.yuv", 2);
+    const std::string clip = contents("clip.yuv");
+    fails(4, asYuv({"transcode", "clip.yuv", "--filter", "rawdump:filename=./clip.yuv", "-o", "x.yuv", "-y"}),
+          {"'./clip.yuv'", "also an input"});
+    EXPECT_TRUE(clip == contents("clip.yuv"));
+    works(asYuv({"transcode", "clip.yuv", "--filter", "rawdump:filename=precious", "-o", "x.yuv", "-y"}));
+    EXPECT_TRUE(clip == contents("precious"));
+}
+
+// Chroma with as many rows as luma, and a box that is nobody's choice.
+TEST_F(Effects, WhatChangesNothingKeepsEveryByte) {
+    const std::string clip = patternBytes(64 * 48 * 2 * 3);
+    folder.write("clip.raw", clip);
+    for (const char* filter : {"deinterlace", "flipper:flip=0", "cropper", "cropper:mode=1", "videofade"}) {
+        works({"transcode", "clip.raw", "--raw", "size=64x48,pixel=I422,rate=25", "--filter", filter, "-o",
+               "out.raw", "-y"});
+        const std::string out = contents("out.raw");
+        EXPECT_TRUE(out == clip) << filter;
+    }
+    works({"frame", "testgen:size=160x90", "--filter", "cropper:mode=3,cropAspect=1.0", "--size", "90x90",
+           "-o", "square.png"});
+    works({"frame", "testgen:size=160x90", "--crop", "88x88+0+0", "--size", "90x90", "-o", "cut.png"});
+    EXPECT_TRUE(contents("square.png") == contents("cut.png")) << "as much of the input as has the shape";
+}
+
 TEST_F(Effects, WarningsOfTheEngineAreShownAndCounted) {
     folder.write("empty.srt", "");
     const Outcome o = tarsel(

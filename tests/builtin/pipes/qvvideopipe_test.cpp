@@ -104,6 +104,37 @@ TEST(VideoPipe, PassesTheDecodersErrorOn) {
     EXPECT_EQ(pipe.process(&decoder, 0), QvStatus::endOfStream);
 }
 
+TEST(VideoPipe, AFilterThatFailsIsRememberedAndStopsNothing) {
+    const struct {
+        std::vector<std::pair<int, const char*>> refusals;
+        int closed, error;
+        const char* text;
+    } cases[] = {
+        {{}, 0, 0, ""},
+        {{{1, "refuseApply"}}, 0, -1, "b: it failed"},
+        {{{2, "refuseClose"}}, -1, -1, "c: it failed"},
+        {{{1, "refuseApply"}, {0, "refuseClose"}}, -1, -1, "b: it failed"},
+    };
+    for (const auto& c : cases) {
+        Pipe pipe({"a", "+b", "c"});
+        for (const auto& [filter, what] : c.refusals) pipe.at(filter).known.set(what, -1);
+        ASSERT_EQ(pipe.open(), 0);
+        for (const int nr : {1, 2}) {
+            QvFrame frame = frameNr(nr);
+            pipe.write(frame);
+            EXPECT_EQ(pipe.process(nullptr, 0), 0);
+            EXPECT_EQ(pipe.frame()->frameNr, nr);
+            pipe.next();
+        }
+        EXPECT_EQ(pipe.close(), c.closed);
+        for (int i = 0; i < 3; ++i) EXPECT_EQ(pipe.at(i).closed, 1);
+        EXPECT_EQ(pipe.errorCode(), c.error);
+        EXPECT_STREQ(pipe.errorDesc(), c.text);
+        EXPECT_EQ(pipe.open(), 0);
+        EXPECT_EQ(pipe.errorCode(), 0) << "another run";
+    }
+}
+
 TEST(VideoPipe, OpeningStopsAtTheFirstFailure) {
     LogCapture log;
     Pipe pipe({"a", "b", "c"});

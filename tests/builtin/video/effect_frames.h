@@ -9,15 +9,19 @@
 #include <memory>
 #include <string>
 #include <utility>
+#include <vector>
 
 #include "builtin/video/samplelayout.h"
 #include "core/value/any.h"
 #include "tests/support/pictures.h"
 
+using Params = std::vector<std::pair<const char*, Any>>;
+
 // An effect with parameters, opened.
 template <class Effect>
 struct OpenedEffect : Effect {
-    OpenedEffect(std::initializer_list<std::pair<const char*, Any>> params = {}) {
+    OpenedEffect(std::initializer_list<Params::value_type> params = {}) : OpenedEffect(Params(params)) {}
+    explicit OpenedEffect(const Params& params) {
         this->init();
         for (const auto& [name, value] : params) EXPECT_EQ(this->setParam(name, value), 0) << name;
         EXPECT_EQ(this->open(), 0) << this->errorDesc();

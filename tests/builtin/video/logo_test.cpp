@@ -16,7 +16,6 @@ namespace {
 
 using Logo = OpenedEffect<QvLogo>;
 using Animated = OpenedEffect<AnimatedLogo>;
-using Params = std::initializer_list<std::pair<const char*, Any>>;
 
 constexpr unsigned char background[] = {200, 90, 40};  // B, G, R
 
@@ -198,15 +197,6 @@ TEST_F(Logos, FilesThatAreNoLogo) {
     const LogCapture log;
     EXPECT_EQ(animated.open(), -1);
     EXPECT_TRUE(log.contains("[animated logo] no video streams in file")) << animated.errorDesc();
-    for (const char* wrong : {"width", "=5", "width=4;;"})
-        EXPECT_NE(animated.setParam("decoderParams", wrong), 0) << wrong;
-    Logo half({{"filename", png_.c_str()}, {"xpos", -7}, {"alpha", 0.5}});
-    AnyDict stored;
-    half.store(stored);
-    Logo other({{"filename", png_.c_str()}});
-    EXPECT_EQ(other.restore(stored), 0);
-    for (const char* name : {"filename", "xpos", "alpha"})
-        EXPECT_EQ(other.getParam(name), half.getParam(name));
 }
 
 TEST_F(Logos, MoviesRunFrameByFrame) {

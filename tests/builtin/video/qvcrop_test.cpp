@@ -1,7 +1,6 @@
 #include "builtin/video/qvcrop.h"
 
 #include <climits>
-#include <vector>
 
 #include "core/media/rect.h"
 #include "core/value/anycontainer.h"
@@ -10,7 +9,6 @@
 
 namespace {
 
-using Params = std::vector<std::pair<const char*, Any>>;
 using Opened = OpenedEffect<QvCrop>;
 
 // Set before open, for an input of 1920x1080; what fails is left out of the result.

@@ -1,7 +1,6 @@
 #include "builtin/video/qvdeinterlace.h"
 
-#include "tests/support/checks.h"
-#include "tests/support/log_capture.h"
+#include "tests/builtin/video/effect_frames.h"
 
 namespace {
 
@@ -61,26 +60,27 @@ TEST(QvDeinterlace, EachMethodTakesItsRows) {
         }
 }
 
-TEST(QvDeinterlace, StatesThatAreNoneChangeNothing) {
-    QvDeinterlace filter, other;
-    filter.init();
-    other.init();
-    filter.setParam("deinterlace", 4);
-    filter.setParam("_position", 3);
-    EXPECT_EQ(filter.setParam("deinterlace", AnyVector()), -5);
-    EXPECT_THROW(filter.setParam("deinterlacer", 1), QvParamException);
-    AnyDict stored;
-    filter.store(stored);
-    const LogCapture log;
-    for (const auto& [key, value, result] : {std::tuple{"kept", Any(1), 0},
-                                             {"name", Any("flipper"), -1},
-                                             {"state", Any(5), -1},
-                                             {"state", Any(AnyDict("deinterlace", AnyVector())), -5}}) {
-        AnyDict state = stored;
-        state.set(key, value);
-        EXPECT_EQ(other.restore(state), result);
-        EXPECT_EQ(other.getParam("deinterlace"), Any("bob"));
-        EXPECT_EQ(other.getParam("_position"), Any(3));
-    }
-    EXPECT_EQ(log.count("[deinterlace] restore - invalid dict"), 2);
+// I422 has a row of chroma for each of luma: all of them are moved like rows of luma.
+TEST(QvDeinterlace, ChromaWithAllRows) {
+    for (const char* method : {"", "top", "bottom", "reverse", "bob"})
+        for (const int height : {8, 7}) {
+            QvFrame in = makePicture(QvFourcc::I422, 16, height);
+            OpenedEffect<QvDeinterlace> filter({{"deinterlace", method}});
+            const QvFrame& out = filter.through(in);
+            for (int p = 1; p < 3; ++p) {
+                QvFrame plane, expected;
+                plane.init(QvFourcc::GRAY, 8, height);
+                for (int y = 0; y < height; ++y)
+                    std::memcpy(plane.plane() + plane.stride() * y, rowOf(in, p, y), 8);
+                const std::string name = method;
+                const int done = name == "top"       ? expected.copyDeinterlaced(plane, true)
+                                 : name == "bottom"  ? expected.copyDeinterlaced(plane, false)
+                                 : name == "reverse" ? expected.copySwitched(plane)
+                                 : name == "bob"     ? expected.copyBob(plane)
+                                                     : expected.copy(plane);
+                ASSERT_EQ(done, 0);
+                for (int y = 0; y < out.height(); ++y)
+                    EXPECT_EQ(std::memcmp(rowOf(out, p, y), rowOf(expected, 0, y), 8), 0) << name << p << y;
+            }
+        }
 }

@@ -1,7 +1,6 @@
 #include "builtin/video/qvflipper.h"
 
 #include "tests/builtin/video/effect_frames.h"
-#include "tests/support/log_capture.h"
 
 namespace {
 
@@ -27,24 +26,6 @@ TEST(QvFlipper, TurnsAllRowsOfEveryFormat) {
             EXPECT_EQ(out.getTimestamp(), 5);
             sameInPlace(Opened(), Opened(), in);
             sameInPlace(Opened({{"flip", 0}}), Opened({{"flip", 0}}), in);
+            EXPECT_TRUE(samplesOf(Opened({{"flip", 0}}).through(in)) == samplesOf(in));
         }
-}
-
-TEST(QvFlipper, StandsAsideAndIsStored) {
-    QvFrame in = makePicture(QvFourcc::I422, 8, 6);
-    Opened off({{"flip", 0}});
-    EXPECT_EQ(samplesOf(off.through(in)), samplesOf(in));
-    AnyDict state;
-    off.store(state);
-    EXPECT_EQ(state.get("state").asDict().get("flip"), Any(0));
-    Opened other;
-    EXPECT_EQ(other.restore(state), 0);
-    EXPECT_EQ(other.getParam("flip"), Any(0));
-    for (const auto& [key, value] : {std::pair<const char*, Any>{"name", "cropper"}, {"state", 7}}) {
-        AnyDict wrong = state;
-        wrong.set(key, value);
-        const LogCapture log;
-        EXPECT_EQ(other.restore(wrong), -1);
-        EXPECT_TRUE(log.contains("[flipper] restore - invalid dict"));
-    }
 }

@@ -1,19 +1,10 @@
 #include "builtin/video/subtitlewriter.h"
 
-#include <gtest/gtest.h>
-
-#include <memory>
-#include <vector>
-
-#include "core/caption/qvsubtitlefilter.h"
-#include "core/engine/qvmodule.h"
-#include "core/engine/qvplugin.h"
 #include "core/engine/qvregistry.h"
-#include "core/filter/qvprocessutil.h"
 #include "core/media/qvgeometry.h"
+#include "tests/builtin/video/effect_frames.h"
 #include "tests/support/engine.h"
 #include "tests/support/log_capture.h"
-#include "tests/support/pictures.h"
 #include "tests/support/temp_folder.h"
 
 namespace {
@@ -23,12 +14,6 @@ constexpr const char* srt =
     "1\n00:00:01,000 --> 00:00:02,000\nHello\n\n"
     "2\n00:00:03,000 --> 00:00:04,000\n<i>two</i>\nlines\n\n"
     "3\n00:00:05,000 --> 00:00:06,000\n\xE9t\xE9\n\n";
-
-struct Given {
-    const char* name;
-    Any value;
-};
-using Params = std::vector<Given>;
 
 class Subtitle : public testing::Test {
   protected:
@@ -46,18 +31,10 @@ class Subtitle : public testing::Test {
         frame.framerate = rate;
         return frame;
     }
-    std::unique_ptr<SubtitleWriter> opened(const Params& params) const {
-        auto writer = std::make_unique<SubtitleWriter>();
-        writer->init();
-        writer->setParam("subtitle_filename", file_.c_str());
-        for (const auto& [name, value] : params) EXPECT_EQ(writer->setParam(name, value), 0) << name;
-        EXPECT_EQ(writer->open(), 0) << writer->errorDesc();
-        return writer;
-    }
-    std::string at(int number, const Params& params = {},
-                   const QvFramerate& rate = QvFramerate(QvRatio(25, 1))) {
+    std::string at(int number, Params params = {}, const QvFramerate& rate = QvFramerate(QvRatio(25, 1))) {
         QvFrame frame = blank(number, rate);
-        EXPECT_EQ(opened(params)->apply(frame), 0);
+        params.insert(params.begin(), {"subtitle_filename", file_.c_str()});
+        EXPECT_EQ(OpenedEffect<SubtitleWriter>(params).apply(frame), 0);
         return pictureBytes(frame);
     }
     bool shows(int number, const Params& params = {}, const QvFramerate& rate = QvFramerate(QvRatio(25, 1))) {
@@ -126,7 +103,8 @@ TEST_F(Subtitle, LooksAsItsParametersSay) {
                                  {{"fontEffect", 3}},
                                  {{"pixelAspect", 2.0}}}) {
         all.push_back(at(30, params));
-        for (std::size_t i = 0; i + 1 < all.size(); ++i) EXPECT_NE(all[i], all.back()) << params[0].name << i;
+        for (std::size_t i = 0; i + 1 < all.size(); ++i)
+            EXPECT_NE(all[i], all.back()) << params[0].first << i;
     }
     const LogCapture log;
     EXPECT_FALSE(shows(30, {{"font_filename", "/nowhere.ttf"}}));
@@ -135,7 +113,7 @@ TEST_F(Subtitle, LooksAsItsParametersSay) {
 
 TEST_F(Subtitle, OpeningTellsWhatItDoesAndFailsForNoSubtitleFile) {
     const LogCapture log;
-    opened({{"speed", 1.5}, {"delay", 20}});
+    at(0, {{"speed", 1.5}, {"delay", 20}});
     for (const std::string& line :
          {"[subwriter] Subtitle file: " + file_, std::string("[subwriter] Font size: 32"),
           std::string("[subwriter] Speed, offset: 1.500000, 20.000000"),
@@ -155,52 +133,6 @@ TEST_F(Subtitle, OpeningTellsWhatItDoesAndFailsForNoSubtitleFile) {
     file_ = folder_.write("empty.srt", "");
     EXPECT_FALSE(shows(30));
     EXPECT_TRUE(log.contains("empty.srt has no subtitles", 4));
-}
-
-TEST_F(Subtitle, IsAModuleOnceAnApplicationAddsIt) {
-    EXPECT_EQ(qv_registry()->newCodec("subtitle"), nullptr);
-    QvPlugin* plugin = qvSubtitlePlugin();
-    ASSERT_EQ(plugin->nrModules(), 1);
-    EXPECT_EQ(plugin, qvSubtitlePlugin());
-    const std::unique_ptr<QvCodec> codec(plugin->module(0)->create()), other(plugin->module(0)->create());
-    codec->init();
-    other->init();
-    const struct {
-        const char* name;
-        Any initial, good, refused;
-    } rows[] = {
-        {"subtitle_filename", "", "/a b.srt", 1},
-        {"font_filename", "", "/a.ttf", 1},
-        {"font_size", 32, 20, 0},
-        {"speed", 1.0, 0.5, -1.0},
-        {"delay", 0.0, -20.5, "soon"},
-        {"encoding", 0, 1252, 99999},
-        {"framerate", Any(), QvFramerate(QvRatio(24, 1)), 0},
-        {"fontEffect", 0, 3, 4},
-        {"pixelAspect", 1.0, 1.5, 0.0},
-        {"color", 0xFFFFFF, 0x102030, 0x1000000},
-    };
-    for (const auto& row : rows) {
-        EXPECT_EQ(codec->getParam(row.name), row.initial) << row.name;
-        EXPECT_EQ(codec->setParam(row.name, row.good), 0) << row.name;
-        EXPECT_NE(codec->setParam(row.name, row.refused), 0) << row.name;
-    }
-    AnyDict stored;
-    codec->store(stored);
-    EXPECT_EQ(other->restore(stored), 0);
-    for (const auto& row : rows) EXPECT_EQ(other->getParam(row.name), row.good) << row.name;
-    EXPECT_EQ(codec->getParam("colorG"), 0x20);
-    EXPECT_EQ(codec->getParam("encodingRange").asVector().at(2).asDict().get("name"), "UTF-8");
-    EXPECT_EQ(codec->getParam("fontEffectRange").asVector().at(3).asDict().get("name"),
-              "Outline w/ hard shadow");
-    const Any set = codec->getParam("paramSet");
-    EXPECT_EQ(set.asVector().size(), 7);
-    for (const Any& desc : set.asVector()) {
-        Any fault;
-        EXPECT_TRUE(QvProcessUtil::checkParamDesc(desc.asDict(), &fault)) << fault.asString("");
-        EXPECT_TRUE(codec->getParam(desc.asDict().getString("name", "")).isValid());
-    }
-    EXPECT_EQ(codec->getParam("format"), 0);
 }
 
 }  // namespace

@@ -1,38 +1,22 @@
 #include "builtin/video/timecodewriter.h"
 
-#include <gtest/gtest.h>
-
 #include <climits>
-#include <memory>
 #include <tuple>
-#include <vector>
 
 #include "core/caption/qvtextrenderingoptions.h"
 #include "core/engine/qvregistry.h"
 #include "core/media/qvgeometry.h"
+#include "tests/builtin/video/effect_frames.h"
 #include "tests/support/counted_memory.h"
 #include "tests/support/engine.h"
 #include "tests/support/log_capture.h"
-#include "tests/support/pictures.h"
 
 namespace {
 
 const QvFramerate pal(QvRatio(25, 1)), palFields(QvRatio(25, 1), 1), ntsc(QvRatio(30000, 1001)),
     drop(QvRatio(30000, 1001), 0, true);
 
-struct Given {
-    const char* name;
-    Any value;
-};
-using Params = std::vector<Given>;
-
-struct Writer : TimecodeWriter {
-    explicit Writer(const Params& params = {}) {
-        init();
-        for (const auto& [name, value] : params) EXPECT_EQ(setParam(name, value), 0) << name;
-        EXPECT_EQ(open(), 0);
-    }
-};
+using Writer = OpenedEffect<TimecodeWriter>;
 
 QvFrame black(int width, int height, const QvFramerate& rate, int number, unsigned fourcc = QvFourcc::BGR4) {
     QvFrame frame;
@@ -165,45 +149,13 @@ TEST_F(Timecode, WriteDrawsOntoACopyAndTakesNoMemoryForAStillText) {
     }
 }
 
-TEST_F(Timecode, ParametersAreCheckedStoredAndRestored) {
-    const std::unique_ptr<QvCodec> codec(qv_registry()->newCodec("timecode"));
-    auto* writer = static_cast<QvVideoFilter*>(codec->getInterface(12));
-    ASSERT_TRUE(writer);
-    EXPECT_TRUE(writer->applySupported());
-    QvFrame frame = black(64, 64, pal, 0);
-    EXPECT_EQ(writer->apply(frame), -18);
-    const struct {
-        const char* name;
-        Any initial, good, refused;
-    } rows[] = {
-        {"mode", "Timecode", "Frame number", "frames"},
-        {"start", "FirstInputFrame", "InPoint", 1},
-        {"startOffset", 0, -5, "x"},
-        {"dropFrame", -1, 1, 2},
-        {"font_filename", "", "/a.ttf", 1},
-        {"colorR", 255, 1, 256},
-        {"colorG", 255, 0, -1},
-        {"colorB", 255, 128, "red"},
-        {"positionX", -1, 4, "left"},
-        {"positionY", -1, 5, Any()},
-        {"renderingOptions", AnyDict(), AnyDict("charSizePt", 20), 20},
-    };
-    for (const auto& row : rows) {
-        EXPECT_EQ(writer->getParam(row.name), row.initial) << row.name;
-        EXPECT_EQ(writer->setParam(row.name, row.good), 0) << row.name;
-        EXPECT_NE(writer->setParam(row.name, row.refused), 0) << row.name;
-        EXPECT_NE(std::string(writer->errorDesc()).find(row.name), std::string::npos);
-    }
-    EXPECT_EQ(writer->setParam("_previewMode", 1), 0);
-    AnyDict stored;
-    writer->store(stored);
-    const std::unique_ptr<QvCodec> other(qv_registry()->newCodec("timecode"));
-    EXPECT_EQ(other->restore(stored), 0);
-    for (const auto& row : rows) EXPECT_EQ(other->getParam(row.name), row.good) << row.name;
-    EXPECT_EQ(writer->open(), 0);
+TEST_F(Timecode, FramesThatItCanNotDrawOn) {
+    Writer writer;
     QvFrame deep = black(64, 64, pal, 0, QvFourcc::v210), nothing;
-    EXPECT_EQ(writer->apply(deep), -10);
-    EXPECT_EQ(writer->apply(nothing), -12);
+    EXPECT_EQ(writer.apply(deep), -10);
+    EXPECT_EQ(writer.apply(nothing), -12);
+    writer.close();
+    EXPECT_EQ(writer.apply(deep), -18);
 }
 
 }  // namespace

@@ -2,7 +2,6 @@
 
 #include <cmath>
 
-#include "core/value/anycontainer.h"
 #include "tests/builtin/video/effect_frames.h"
 #include "tests/support/log_capture.h"
 
@@ -59,9 +58,6 @@ TEST(CVideoFade, RampsAreLinearAndMeetBlackAtTheEnds) {
                             ", out=" + std::to_string(row.out) + ", count=" + std::to_string(row.count)),
                   1);
     }
-    Opened fade;
-    EXPECT_NE(fade.setParam("fade_in", -1), 0);
-    EXPECT_EQ(fade.getParam("fade_in"), Any(0));
 }
 
 TEST(CVideoFade, EveryFormatFadesToItsBlackAndKeepsAlpha) {

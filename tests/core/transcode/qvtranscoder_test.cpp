@@ -69,6 +69,13 @@ TEST_F(Transcoder, EveryEndHasItsOwnResult) {
         {"picture ends", [](LinkedJob& j) { j.pipe.video.result = -4; }, 0, 0, "v0 a1920 close done-4"},
         {"source", [](LinkedJob& j) { j.decoder.failAt = 0; }, -1, -1, "abort done-1"},
         {"close", [](LinkedJob& j) { j.pipe.closeResult = -77; }, -77, -1, "close done-77"},
+        {"filter",
+         [](LinkedJob& j) {
+             j.t.setParam("audioEffects",
+                          AnyDict("customFilters",
+                                  AnyVector(Any(AnyDict("name", "aquant", "_on", 1, "refuseClose", -78)))));
+         },
+         -78, -1, "close done-78"},
         {"left open", [](LinkedJob& j) { j.t.setParam("closeEncoder", 0); }, 0, 0, "0.50 done0"},
         {"throw", [](LinkedJob& j) { j.t.onProcess = []() -> int { throw 5; }; }, -1, -1, "abort done-1"},
         {"assert", [](LinkedJob& j) { j.t.onProcess = [&j] { return j.t.pause(); }; }, -1, -1,

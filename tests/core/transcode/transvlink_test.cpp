@@ -103,7 +103,9 @@ TEST(TransVLink, PointsChooseTheFrames) {
 }
 
 TEST(TransVLink, FailuresComeOut) {
-    const AnyDict logo("name", "logo", "_on", 1, "refuseOpen", -3);
+    const auto logo = [](const char* refusal) {
+        return customFilters(AnyVector(Any(AnyDict("name", "logo", "_on", 1, refusal, -3))));
+    };
     const struct {
         std::function<void(Job&)> arrange;
         int open, run;
@@ -119,7 +121,8 @@ TEST(TransVLink, FailuresComeOut) {
              j.encoder.video.params.set("framerate", f50);
          },
          -1, 0, "filter module 'frconvert' is not available"},
-        {[&](Job& j) { j.params.set("effects", customFilters(AnyVector(Any(logo)))); }, -1, 0, "logo"},
+        {[&](Job& j) { j.params.set("effects", logo("refuseOpen")); }, -1, 0, "logo"},
+        {[&](Job& j) { j.params.set("effects", logo("refuseClose")); }, 0, 0, "logo: it failed"},
         {[](Job& j) { j.decoder.failAt = 3; }, 0, -1, "the disc is gone"},
         {[](Job& j) { j.encoder.video.result = -7; }, 0, -7, ""},
     };
@@ -130,6 +133,7 @@ TEST(TransVLink, FailuresComeOut) {
         ASSERT_EQ(job.open(), row.open);
         if (row.open == 0) {
             EXPECT_EQ(job.run(), row.run);
+            EXPECT_EQ(job.link.close(), row.run == 0 ? -3 : 0) << "what nothing told before";
         }
         EXPECT_NE(std::string(job.link.errorDesc()).find(row.text), std::string::npos);
         EXPECT_NE(job.link.errorCode(), 0);
