@@ -4,6 +4,7 @@
 #include "tests/support/fake_filters.h"
 #include "tests/support/fake_streams.h"
 #include "tests/support/log_capture.h"
+#include "tests/support/pictures.h"
 
 namespace {
 
@@ -120,7 +121,8 @@ TEST(VideoPipe, AFilterThatFailsIsRememberedAndStopsNothing) {
         for (const auto& [filter, what] : c.refusals) pipe.at(filter).known.set(what, -1);
         ASSERT_EQ(pipe.open(), 0);
         for (const int nr : {1, 2}) {
-            QvFrame frame = frameNr(nr);
+            QvFrame frame = makePicture(QvFourcc::GRAY, 16, 8);
+            frame.frameNr = nr;
             pipe.write(frame);
             EXPECT_EQ(pipe.process(nullptr, 0), 0);
             EXPECT_EQ(pipe.frame()->frameNr, nr);
