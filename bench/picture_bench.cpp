@@ -1,11 +1,17 @@
 // What it costs to convert and scale pictures of 1920 x 1080 on one thread, as ratios to the libraries that
-// others use for it; and what a second worker gains.
+// others use for it; what a second worker gains; and the pairs of formats that cost most, as ratios to a
+// memcpy of input and output.
+#include <algorithm>
+#include <chrono>
 #include <cstdint>
 #include <cstdio>
+#include <cstring>
 #include <memory>
+#include <string>
 #include <vector>
 
 #include "bench/ratio.h"
+#include "builtin/kernels/formats.h"
 #include "core/engine/qvthreadpool.h"
 #include "core/filter/srscaler.h"
 #include "core/media/fourcc.h"
@@ -240,6 +246,76 @@ void workers(QvRatioBench& bench) {
         [&] { ours(planar, small, QvScale::standard); });
 }
 
+// --- Every pair of formats.
+
+constexpr int bandLines = 270;  // of a picture: the order counts, not the last percent
+
+std::string nameOf(int format) {
+    std::string name = srk::formats()[static_cast<size_t>(format)].name;
+    if (const auto at = name.find("XX"); at != std::string::npos) name.replace(at, 2, "10");
+    name.resize(4, ' ');
+    return name;
+}
+
+size_t bytesOf(int format) {
+    srk::Picture picture;
+    picture.format = &srk::formats()[static_cast<size_t>(format)];
+    picture.width = width;
+    picture.height = bandLines;
+    srk::Byte base = 0;
+    srk::layOut(picture, &base, 0);
+    size_t bytes = 0;
+    for (int p = 0; p < picture.format->planes(); ++p)
+        bytes += static_cast<size_t>(picture.planes[p].stride) * static_cast<size_t>(picture.planeHeight(p));
+    return bytes;
+}
+
+template <class Work>
+double bestOf(int rounds, const Work& work) {
+    double best = 1e9;
+    for (int i = 0; i < rounds; ++i) {
+        const auto begin = std::chrono::steady_clock::now();
+        work();
+        best =
+            std::min(best, std::chrono::duration<double>(std::chrono::steady_clock::now() - begin).count());
+    }
+    return best;
+}
+
+void worstPairs() {
+    constexpr double limit = 5;
+    struct Pair {
+        std::string name;
+        double ratio;
+    };
+    std::vector<Pair> pairs;
+    std::vector<uint8_t> from(static_cast<size_t>(width) * bandLines * 16 + 64, 100), to(from.size());
+    const auto codeOf = [](const std::string& name) {
+        unsigned code = 0;
+        std::memcpy(&code, name.data(), 4);
+        return code;
+    };
+    for (int s = 0; s < srk::formatCount; ++s)
+        for (int t = 0; t < srk::formatCount; ++t) {
+            const std::string source = nameOf(s), target = nameOf(t);
+            const double ours = bestOf(5, [&] {
+                SRScaler(QvScale::oneThread, codeOf(source), from.data(), 0, width, bandLines, codeOf(target),
+                         to.data(), 0, width, bandLines, 0, QvScale::standard, nullptr);
+            });
+            const double copies = bestOf(5, [&] {
+                std::memcpy(to.data(), from.data(), bytesOf(s));
+                std::memcpy(to.data(), from.data(), bytesOf(t));
+            });
+            pairs.push_back({source + " to " + target, ours / copies});
+        }
+    std::sort(pairs.begin(), pairs.end(), [](const Pair& a, const Pair& b) { return a.ratio > b.ratio; });
+    const auto above =
+        std::count_if(pairs.begin(), pairs.end(), [](const Pair& p) { return p.ratio > limit; });
+    std::printf("pairs of formats above %.0f times a memcpy of input and output: %ld of %zu; the worst:\n",
+                limit, static_cast<long>(above), pairs.size());
+    for (size_t i = 0; i < 12; ++i) std::printf("    %-16s %6.2f\n", pairs[i].name.c_str(), pairs[i].ratio);
+}
+
 }  // namespace
 
 int main() {
@@ -254,4 +330,5 @@ int main() {
     againstZimg(bench);
 #endif
     workers(bench);
+    worstPairs();
 }

@@ -1,5 +1,6 @@
 // Calls the picture scaler with any formats, sizes, strides, flags and rectangles. Both pictures stand in
 // memory of just the size that an accepted call may use, so that the sanitizer sees one byte too many.
+#include <algorithm>
 #include <cstdint>
 #include <cstdlib>
 #include <cstring>
@@ -82,6 +83,37 @@ Given givenOf(Input& input) {
     return given;
 }
 
+// The planes of a picture as they lie in its memory, each walked upwards if its bit is set.
+QvScalePicture recordOf(Given& given, unsigned upwards) {
+    QvScalePicture record = {qvFourcc("EXT1"), given.fourcc, given.width, given.height, 0, 0, 0, {}};
+    if (given.memory.empty()) return record;
+    srk::Picture picture;
+    picture.format = &srk::formats()[static_cast<size_t>(srk::formatNumber(given.fourcc) & 0xffff)];
+    picture.width = given.width;
+    picture.height = given.height;
+    srk::layOut(picture, given.memory.data(), std::abs(given.stride));
+    int* const strides[3] = {&record.stride, &record.stride1, &record.stride2};
+    for (int p = 0; p < picture.format->planes(); ++p) {
+        auto plane = picture.planes[p];
+        if (upwards >> p & 1)
+            plane = {plane.data + plane.stride * std::max(picture.planeHeight(p) - 1, 0), -plane.stride};
+        record.planes[p] = plane.data;
+        *strides[p] = static_cast<int>(plane.stride);
+    }
+    // Planes of equal size may change places.
+    if (picture.format->planes() == 3 && !picture.format->has(srk::uBeforeV)) {
+        std::swap(record.planes[1], record.planes[2]);
+        std::swap(record.stride1, record.stride2);
+    }
+    return record;
+}
+
+void asRecords(Given& source, Given& target, unsigned mode, unsigned flags, const int* rectangles) {
+    const QvScalePicture from = recordOf(source, flags >> 9), to = recordOf(target, flags >> 16);
+    SRScaler(mode, from.tag, &from, 0, 0, 0, to.tag, const_cast<QvScalePicture*>(&to), 0, 0, 0, 0, flags,
+             rectangles);
+}
+
 }  // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
@@ -106,5 +138,6 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     SRScaler(mode, source.fourcc, start(source), source.stride, source.width, source.height, target.fourcc,
              start(target), target.stride, target.width, target.height, 0, flags,
              modes & 16 ? rectangles : nullptr);
+    if (modes & 32) asRecords(source, target, mode, flags, modes & 16 ? rectangles : nullptr);
     return 0;
 }
