@@ -368,6 +368,19 @@ class Band {
             scaledInto(plan_.again ? 1 : 0, plane, y, to);
     }
 
+    // A plane that only becomes wider needs no line between. False: it needs more.
+    bool raisedInto(int plane, int y, uint16_t* to, int width) {
+        const Group& group = scaling(0).of(plane);
+        const Format& format = *source_.format;
+        if (hasMatrix() || !format.planar() || !group.copies() || isNeutral(0, plane)) return false;
+        const Byte* from = lineOf(source_, plane, y + group.down.offset);
+        if (format.packing == Packing::planar16)
+            raiseWords(to, from + 2 * group.across.offset, count(width), source_.depth);
+        else
+            widen(to, from + group.across.offset, count(width), false);
+        return true;
+    }
+
     void planeInto(int plane, int y) {
         const Format& format = *target_.format;
         const int width = plane ? plan_.request.width / format.across() : plan_.request.width;
@@ -378,7 +391,11 @@ class Band {
         } else {
             const bool inPlace = format.packing == Packing::planar16 && target_.depth == 16 &&
                                  reinterpret_cast<uintptr_t>(line) % alignof(uint16_t) == 0;
-            if (inPlace) return finalInto(plane, y, reinterpret_cast<uint16_t*>(line), width);
+            if (inPlace) {
+                auto* const words = reinterpret_cast<uint16_t*>(line);
+                if (!raisedInto(plane, y, words, width)) finalInto(plane, y, words, width);
+                return;
+            }
             if (format.packing == Packing::planar16)
                 lowerWords(line, finalLine(plane, y), count(width), target_.depth);
             else
