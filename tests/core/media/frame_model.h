@@ -1,4 +1,4 @@
-// A picture as plain bytes, for references that are written without the code under test.
+// Pictures of noise, and their bytes for comparison.
 #pragma once
 
 #include <random>
@@ -13,23 +13,6 @@ struct FrameModel {
     int height = 0;
     std::vector<std::vector<unsigned char>> planes;
     std::vector<int> strides;
-
-    unsigned char& at(int plane, int row, int byte) {
-        return planes.at(static_cast<std::size_t>(plane))
-            .at(static_cast<std::size_t>(row * strides[static_cast<std::size_t>(plane)] + byte));
-    }
-    unsigned char at(int plane, int row, int byte) const {
-        return const_cast<FrameModel*>(this)->at(plane, row, byte);
-    }
-    // Samples of one or two bytes, low byte first.
-    int sample(int plane, int row, int byte, int unit) const {
-        return at(plane, row, byte) + (unit == 2 ? 256 * at(plane, row, byte + 1) : 0);
-    }
-    void setSample(int plane, int row, int byte, int unit, int value) {
-        at(plane, row, byte) = static_cast<unsigned char>(value);
-        if (unit == 2) at(plane, row, byte + 1) = static_cast<unsigned char>(value >> 8);
-    }
-    int rows(int plane) const { return plane ? height / 2 : height; }
     bool operator==(const FrameModel&) const = default;
 };
 
@@ -83,8 +66,3 @@ inline const std::vector<unsigned>& allFormats() {
                                                   v210, BGR3, BGR4, BGRA, ARGB, R32C, b64a, R555, R565};
     return formats;
 }
-
-struct Size {
-    int width, height;
-};
-constexpr Size oddSizes[] = {{7, 5}, {1, 1}, {2, 2}, {33, 3}, {18, 10}, {70, 21}};

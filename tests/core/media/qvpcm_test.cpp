@@ -63,47 +63,25 @@ TEST(QvPcm, SilenceDependsOnTheWidth) {
     }
 }
 
-TEST(QvPcm, InterleavesAnyWidthAndChannelCount) {
-    for (int width = 1; width <= 4; ++width)
-        for (int channels : {1, 2, 6}) {
-            constexpr int n = 5;
-            const auto channelBytes = static_cast<std::size_t>(n * width);
-            std::vector<Bytes> in, out;
-            AnyVector from, to;
-            for (int c = 0; c < channels; ++c) {
-                in.push_back(ramp(channelBytes));
-                in.back()[0] = static_cast<unsigned char>(200 + c);
-                out.emplace_back(channelBytes + 4, 99);
-            }
-            for (auto& bytes : in) from.append(Any(static_cast<const void*>(bytes.data())));
-            for (auto& bytes : out) to.append(Any(static_cast<const void*>(bytes.data())));
-            QvPcm pcm;
-            pcm.init(2, channels, width, 48000);
-            pcm.addSilence(1);
-            ASSERT_EQ(pcm.combineWrite(n, from), 0);
-            ASSERT_EQ(pcm.samples(), n + 1);
-            for (int i = 0; i < n * channels * width; ++i)
-                ASSERT_EQ(pcm.ptr(1)[i],
-                          in[static_cast<std::size_t>(i / width % channels)]
-                            [static_cast<std::size_t>(i / (width * channels) * width + i % width)]);
-            pcm.erase(1);
-            ASSERT_EQ(pcm.combineRead(0, to), 0);
-            EXPECT_EQ(out[0], Bytes(channelBytes + 4, 99));
-            ASSERT_EQ(pcm.combineRead(n, to), 0);
-            EXPECT_EQ(pcm.samples(), n);
-            for (std::size_t c = 0; c < in.size(); ++c) {
-                in[c].insert(in[c].end(), 4, 99);
-                EXPECT_EQ(out[c], in[c]);
-            }
-            EXPECT_THROW(pcm.combineRead(n + 1, to), QvAssertFailure);
-            to.append(to[0]);
-            EXPECT_THROW(pcm.combineRead(n, to), QvAssertFailure);
-            from.popBack();
-            EXPECT_THROW(pcm.combineWrite(n, from), QvAssertFailure);
-        }
-    QvPcm wide;
-    wide.init(1, 1, 8, 48000);
-    EXPECT_THROW(wide.combineWrite(1, AnyVector(Any(static_cast<const void*>(&wide)))), QvAssertFailure);
+TEST(QvPcm, InterleavesAnyWidth) {
+    const std::string mixed[] = {"aAbBcC", "abABcdCDefEF", "abcABCdefDEFghiGHI", "abcdABCDefghEFGHijklIJKL"};
+    for (int width = 1; width <= 4; ++width) {
+        std::string small = "abcdefghijkl", large = "ABCDEFGHIJKL";
+        AnyVector channels(Any(static_cast<const void*>(small.data())),
+                           Any(static_cast<const void*>(large.data())));
+        QvPcm pcm;
+        pcm.init(2, 2, width, 48000);
+        pcm.addSilence(1);
+        ASSERT_EQ(pcm.combineWrite(3, channels), 0);
+        const std::string& wanted = mixed[width - 1];
+        EXPECT_EQ(std::string(pcm.ptr(1), pcm.ptr(1) + 6 * width), wanted);
+        pcm.erase(1);
+        small.assign(12, '.'), large.assign(12, '.');
+        ASSERT_EQ(pcm.combineRead(3, channels), 0);
+        const auto bytes = static_cast<std::size_t>(3 * width);
+        EXPECT_EQ(small, std::string("abcdefghijkl").substr(0, bytes) + std::string(12 - bytes, '.'));
+        EXPECT_EQ(large.substr(0, bytes), std::string("ABCDEFGHIJKL").substr(0, bytes));
+    }
 }
 
 TEST(QvPcm, CopiesShareTheBufferUntilOneGrows) {
@@ -120,35 +98,8 @@ TEST(QvPcm, CopiesShareTheBufferUntilOneGrows) {
     EXPECT_EQ(*view.ptr(1), 77);
 }
 
-TEST(QvPcm, ConvertsUnits) {
-    QvPcm pcm;
-    pcm.init(10, 2, 3, 48000);
-    EXPECT_TRUE(pcm.samples2bytes(7) == 42 && pcm.bytes2samples(47) == 7);
-    EXPECT_EQ(pcm.ms2samples(40 * 1000 * 1000, 48), 1920000);
-    EXPECT_TRUE(pcm.samples2ms(44100, 44100) == 1000 && pcm.samples2ms(44099, 44100) == 999);
-    EXPECT_THROW(pcm.samples2ms(1, 0), QvAssertFailure);
-}
-
-TEST(QvPcm, CopiesMetaOnly) {
-    QvPcm from, to;
-    from.init(1, 1, 1, 96000);
-    from.setPosition(1LL << 40);
-    to.init(5, 2, 2, 48000);
-    to.addSilence(3);
-    to.copyMeta(from);
-    EXPECT_TRUE(to.samplerate() == 96000 && to.position() == 1LL << 40 && to.samples() == 3 &&
-                to.size() == 5 && to.channels() == 2 && to.bytesPerSample() == 2);
-}
-
 TEST(QvPcm, FailuresAreAssertionsOrStatuses) {
     QvPcm pcm;
-    constexpr char invalid[] = "Invalid sample";
-    const std::function<void()> needsAFormat[] = {
-        [&] { pcm.ptr(0); },           [&] { pcm.clear(); },           [&] { pcm.bytes(); },
-        [&] { pcm.sizeBytes(); },      [&] { pcm.write(0, nullptr); }, [&] { pcm.ms2samples(1, 1); },
-        [&] { pcm.samples2ms(1, 1); }, [&] { pcm.samples2bytes(1); },  [&] { pcm.bytes2samples(1); }};
-    for (const auto& operation : needsAFormat) EXPECT_EQ(failureOf(operation), "QvPcm not inited");
-
     const struct {
         int size, channels, width;
     } impossible[] = {{INT_MAX, 2, 2}, {-1, 2, 2}, {1, 0, 2}, {1, 2, -1}, {INT_MAX, INT_MAX, INT_MAX}};
@@ -157,14 +108,10 @@ TEST(QvPcm, FailuresAreAssertionsOrStatuses) {
         EXPECT_FALSE(pcm.inited());
     }
     pcm.init(2, 1, 2, 48000);
-    for (int sample : {-1, 2, INT_MAX}) EXPECT_EQ(failureOf([&] { pcm.ptr(sample); }), invalid);
+    for (int sample : {-1, 2, INT_MAX}) EXPECT_THROW(pcm.ptr(sample), QvAssertFailure);
     EXPECT_THROW(pcm.setSamples(3), QvAssertFailure);
     pcm.setSamples(2);
-    // Nothing into a full buffer asks for the address behind its last sample.
-    EXPECT_EQ(failureOf([&] { pcm.write(0, pcm.ptr(0)); }), invalid);
-    LogCapture log;
     EXPECT_EQ(pcm.write(INT_MAX, pcm.ptr(0)), QvStatus::outOfMemory);
-    EXPECT_TRUE(log.contains("[QvPcm] Out of memory"));
     EXPECT_EQ(pcm.addSilence(INT_MAX), QvStatus::outOfMemory);
     EXPECT_EQ(pcm.grow(INT_MAX), QvStatus::outOfMemory);
     EXPECT_EQ(pcm.samples(), 2);

@@ -6,25 +6,6 @@
 
 namespace {
 
-TEST(QvRatio, ReducesOnlyPositiveMembers) {
-    const struct {
-        QvRatio in, out;
-        int gcd;
-    } cases[] = {
-        {{50, 2}, {25, 1}, 2},
-        {{-50, 2}, {-50, 2}, 0},
-        {{5, 0}, {5, 0}, 0},
-        {{INT_MAX, INT_MAX}, {1, 1}, INT_MAX},
-    };
-    for (auto c : cases) {
-        EXPECT_EQ(c.in.gcd(), c.gcd);
-        c.in.reduce();
-        EXPECT_EQ(c.in, c.out);
-    }
-    EXPECT_NE(QvRatio(50, 2), QvRatio(25, 1));
-    EXPECT_EQ(QvRatio(7, 0).ratio(), 0.0);
-}
-
 TEST(QvRatio, Reduces64BitPairsWithTheirSigns) {
     const struct {
         long long a, b, gcd, reducedA, reducedB;
@@ -52,7 +33,6 @@ TEST(QvRatio, FindsTheRatioOfADouble) {
         {23.98, 10000, 0, {1199, 50}},
         {25.0, 1, -1, {-1, -1}},
         {3.14159265358979, 5, -1, {-1, -1}},
-        {1e30, 10000, -1, {-1, -1}},
         {__builtin_nan(""), 10000, -1, {-1, -1}},
     };
     for (const auto& c : cases) {
