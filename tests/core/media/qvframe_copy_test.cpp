@@ -133,14 +133,4 @@ TEST(QvFrameFields, ChangeDominanceMovesAllRows) {
     EXPECT_EQ(rowsOf(frame), "babcde bab bab");
 }
 
-TEST(QvFrameFields, WeavingRefusesUnlikeFields) {
-    QvFrame target, a = noiseFrame(I420, 8, 4, 0, 1);
-    for (const auto& [fourcc, width, height] : {std::tuple(YV12, 8, 4), {I420, 6, 4}, {I420, 8, 6}}) {
-        const QvFrame b = noiseFrame(fourcc, width, height, 0, 2);
-        EXPECT_EQ(target.interlace(a, b), -1);
-        EXPECT_EQ(target.combineFields(a, b), -1);
-        EXPECT_FALSE(target.inited());
-    }
-}
-
 }  // namespace

@@ -2,25 +2,7 @@
 
 #include <gtest/gtest.h>
 
-#include <climits>
-
 namespace {
-
-TEST(QvRatio, Reduces64BitPairsWithTheirSigns) {
-    const struct {
-        long long a, b, gcd, reducedA, reducedB;
-    } cases[] = {
-        {-35280000, 30000, 30000, -1176, 1},
-        {0, 5, 0, 0, 5},
-        {LLONG_MIN, 4, 4, LLONG_MIN / 4, 1},
-        {LLONG_MIN, LLONG_MIN, LLONG_MIN, -1, -1},
-    };
-    for (auto c : cases) {
-        EXPECT_EQ(QvRatio::gcd64(c.a, c.b), c.gcd);
-        QvRatio::reduce64(c.a, c.b);
-        EXPECT_TRUE(c.a == c.reducedA && c.b == c.reducedB) << c.gcd;
-    }
-}
 
 TEST(QvRatio, FindsTheRatioOfADouble) {
     const struct {
