@@ -231,6 +231,10 @@ void PictureEffects::addOptions(FiltersState& state, long long frames, bool alon
     for (const auto& spec : options_.filters) {
         if (filterType(spec) != kVideo) continue;
         const AnyDict filter = filterState(spec);
+        const std::string name = filter.getString("name", "");
+        if ((name == "flipper" || name == "cropper" || name == "deinterlace") && state.isSet(name.c_str()))
+            throw Failure(Exit::usage,
+                          "--filter " + name + ": it has one place in the chain, which is taken");
         append(state, filter, filter.get("_front").isTrue());
     }
     for (const auto& logo : options_.logos) append(state, logoState(logo, out_), false);

@@ -247,6 +247,7 @@ TEST_F(Effects, WhatCanNotBeDoneIsTold) {
         {2, {"--subtitles", "x.srt", "--subtitle-style", "effect=glow"}, {"'glow'", "outline"}},
         {3, {"--subtitles", "x.srt", "--subtitle-style", "font=gone.ttf"}, {"font", "'gone.ttf'"}},
         {5, {"--filter", "brightnes"}, {"'brightnes'", "'brightness'"}},
+        {2, {"--flip", "--filter", "flipper"}, {"--filter flipper", "taken"}},
         {2, {"--filter", "logo:filname=x"}, {"'filname'", "no parameter"}},
         {2, {"--filter", "brightness:gamma=much"}, {"--filter brightness", "'gamma'"}},
     };
