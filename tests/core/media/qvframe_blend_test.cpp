@@ -86,6 +86,12 @@ TEST(QvFrameBlend, PlacesAreEvenAndCutAtTheEdges) {
     }
 }
 
+TEST(QvFrameBlend, TallTargetsTakeNothingBelowTheirWidth) {
+    QvFrame target = lettered(GRAY, 2, 6, 0, '.', false);
+    target.blend(0, 2, lettered(GRAY, 2, 2, 0, 'a', true));
+    EXPECT_EQ(textOf(target), "../../../../../..");
+}
+
 TEST(QvFrameBlend, MasksSelectPixelsFromTheirOwnPlace) {
     for (unsigned fourcc : {BGRA, I420, W016}) {
         const QvFrame source = lettered(fourcc, 4, 4, 0, 'a', true);
