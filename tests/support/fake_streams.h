@@ -92,18 +92,12 @@ class FakeDecoder : public QvDecodePipe {
     long long nrSamples(int stream) const override {
         return tracks.at(static_cast<std::size_t>(stream))->total;
     }
-    int readMeta(int, int, AnyDict& out) override {
-        if (captionEvery == 0 || (next - 1) % captionEvery != 0) return -1;
-        out.clear();
-        out.set("captions", next - 1);
-        return 0;
-    }
     QvFrame* getFramePtr(int) override { return &frame; }
     QvPcm* getAudioPtr(int stream) override { return &tracks.at(static_cast<std::size_t>(stream))->pcm; }
     int select(int, int) override { return 0; }
     int deselect(int, int) override { return 0; }
     int selected(AnyDict&) const override { return 0; }
-    bool isSelected(int, int) const override { return isOn; }
+    bool isSelected(int, int) const override { return true; }
 
     struct Track {
         AnyDict params;
@@ -124,8 +118,6 @@ class FakeDecoder : public QvDecodePipe {
     int truncatedAt = -1;
     int failAt = -1;
     int seekResult = 0;
-    int captionEvery = 0;
-    bool isOn = true;
 };
 
 template <class Base>
@@ -155,14 +147,12 @@ class FakeVideoEncoder : public FakeEncoder<QvVideoEncoder> {
     int writeFrame(QvFrame* frame) override {
         numbers.push_back(frame ? frame->frameNr : -1);
         addresses.push_back(frame);
-        captions.push_back(frame && frame->subpic() ? frame->subpic()->getInt32("captions", -2) : -1);
         return result;
     }
     QvFrame* lastFrame() override { return nullptr; }
 
     std::vector<int> numbers;
     std::vector<QvFrame*> addresses;
-    std::vector<int> captions;
 };
 
 class FakeAudioEncoder : public FakeEncoder<QvAudioEncoder> {

@@ -62,13 +62,9 @@ TEST_F(Pushing, EverythingArrives) {
     for (int i = 0; i < before; ++i) pushPicture(i);
     writeSamples(push, 1200, 1, sound);  // more than twice what fits
     EXPECT_EQ(log.count("[FrameBuffer] *** Growing buffer to"), 3);
-    EXPECT_TRUE(log.contains("Growing buffer to 32 frames", QvLogMask::warning));
-    EXPECT_TRUE(log.contains("[SampleBuffer] *** Growing to 1500 samples", QvLogMask::warning));
     writeSamples(push, 1000, 2, sound);
-    EXPECT_TRUE(log.contains("[SampleBuffer] *** Growing to 3000 samples", QvLogMask::warning));
 
     ASSERT_EQ(push.start(), 0);
-    EXPECT_THROW(push.start(), QvAssertFailure);
     std::thread videoWriter([&] {
         for (int i = before; i < frames; ++i) pushPicture(i);
     });
@@ -85,43 +81,11 @@ TEST_F(Pushing, EverythingArrives) {
     waitUntil(push, &QvPushEncoder::needsVideo);
     EXPECT_FALSE(push.running());
     EXPECT_EQ(push.close(false), 0);
-    EXPECT_TRUE(log.contains("[pushencoder] total out frames 60"));
     ASSERT_EQ(pipe_->close(), 0);
     EXPECT_EQ(read("out.raw"), pictures);
     const auto samples = static_cast<size_t>(QvUtil::samplesForFrames(frames, rate, samplerate));
     ASSERT_GT(sound.size(), samples * 4);
     EXPECT_EQ(read("out.wav").substr(80), sound.substr(0, samples * 4));
-}
-
-TEST_F(Pushing, SoundAlone) {
-    QvPushEncoder push;
-    add(push, false, true);
-    ASSERT_EQ(push.open(), 0);
-    ASSERT_EQ(push.start(), 0);
-    std::string sound;
-    for (unsigned i = 0; i < 20; ++i) {
-        waitUntil(push, &QvPushEncoder::needsAudio);
-        writeSamples(push, 777, i, sound);
-    }
-    push.writeSamples(nullptr, 0);
-    waitUntil(push, &QvPushEncoder::needsAudio);
-    EXPECT_EQ(push.close(false), 0);
-    ASSERT_EQ(pipe_->close(), 0);
-    EXPECT_EQ(read("out.wav").substr(80), sound);
-}
-
-TEST_F(Pushing, AnEndMarkDropsWhatIsQueued) {
-    QvPushEncoder push;
-    add(push, true, false);
-    ASSERT_EQ(push.open(), 0);
-    QvFrame frame = picture(1);
-    for (int i = 0; i < 3; ++i) EXPECT_EQ(push.writeFrame(&frame, 0), 0);
-    EXPECT_EQ(push.writeFrame(nullptr, 0), QvStatus::endOfStream);
-    ASSERT_EQ(push.start(), 0);
-    waitUntil(push, &QvPushEncoder::needsVideo);
-    EXPECT_EQ(push.close(false), 0);
-    EXPECT_EQ(pipe_->close(), 0);
-    EXPECT_EQ(read("out.raw"), "");
 }
 
 TEST_F(Pushing, FormatsAreChecked) {
@@ -140,25 +104,7 @@ TEST_F(Pushing, FormatsAreChecked) {
         if (row.bits) format.set("bitsPerSample", row.bits);
         EXPECT_EQ(push.addAudioStream(format, nullptr), row.logged ? -1 : 0);
         EXPECT_EQ(log.count("[PushEncoder] addAudioStream - invalid", QvLogMask::error), row.logged);
-        EXPECT_EQ(log.contains("invalid bitsPerSample (40)"), row.bytes == 5);
     }
-    AnyDict odd("samplerate", 48000, "channels", 1, "bitsPerSample", 17);
-    EXPECT_THROW(push.addAudioStream(odd, nullptr), QvAssertFailure);
-    AnyDict complete = videoFormat, incomplete = videoFormat;
-    incomplete.remove("framerate");
-    EXPECT_EQ(push.addVideoStream(incomplete, nullptr), QvStatus::failed);
-    EXPECT_EQ(push.addVideoStream(complete, nullptr), 0);
-    QvFrame other = makePicture(QvFourcc::YUYV, width, height), none;
-    EXPECT_EQ(push.writeFrame(&other, 0), QvStatus::invalidArgument);
-    EXPECT_EQ(push.writeFrame(&none, 0), QvStatus::invalidArgument);
-    EXPECT_THROW(push.writeFrame(&other, 1), QvAssertFailure);
-    QvPcm mono;
-    fillSound(mono, 10, 1, 2, 48000);
-    EXPECT_EQ(push.writeSamples(&mono, 0), QvStatus::invalidArgument);
-    EXPECT_THROW(push.writeSamples(&mono, -1), QvAssertFailure);
-    EXPECT_THROW(push.start(), QvAssertFailure);
-    EXPECT_EQ(push.open(), QvStatus::failed);  // without an encode pipe
-    EXPECT_EQ(push.close(false), 0);
 }
 
 // Before and after the start, while the worker waits for either kind, while it works, while others write; and

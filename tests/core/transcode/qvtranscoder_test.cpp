@@ -17,35 +17,10 @@ class Transcoder : public testing::Test {
 
 TEST_F(Transcoder, SoundFollowsThePictureAndTheOutputIsClosedBeforeTheEnd) {
     LinkedJob job;
-    FakeMuxer muxer("asfmux");
-    job.pipe.muxer = &muxer;
     job.decoder.extra.set("meta", AnyDict("title", "x", "startTimecode", "00:00:02:05"));
-    EXPECT_EQ(job.t.getState(), QvTranscoder::connected);
-    LogCapture log;
     EXPECT_EQ(job.t.transcode(true), 0);
-    EXPECT_EQ(job.events.take(), "open open v0 a1920 0.00 v1 a1920 0.50 muxclose close done0");
-    EXPECT_EQ(job.t.getState(), QvTranscoder::connected);
-    EXPECT_EQ(muxer.params.getInt32("_totalFrames"), 2);
-    EXPECT_EQ(muxer.params.get("meta").asDict().getString("title"), std::string("x"));
-    EXPECT_EQ(muxer.params.getInt32("timecodeOffset"), 55);
+    EXPECT_EQ(job.events.take(), "open open v0 a1920 0.00 v1 a1920 0.50 close done0");
     EXPECT_EQ(job.pipe.video.params.getInt32("timecodeOffset"), 55);
-    EXPECT_TRUE(log.contains("Profile: n/a", QvLogMask::debug));
-    EXPECT_TRUE(log.contains("Muxer: asfmux (asfmux)", QvLogMask::debug));
-    EXPECT_TRUE(log.contains("[transcoder] cbMuxClose() returned", QvLogMask::info));
-}
-
-TEST_F(Transcoder, AnAudioOnlyRunEndsAtTheLastSample) {
-    for (const long long samples : {48000LL, 0LL}) {
-        Job job(25);
-        job.pipe.videoStreams = 0;
-        job.decoder.tracks[0]->params.set("samples", samples);
-        ASSERT_EQ(job.task.link(&job.decoder, 2, 0, 0), 0);
-        NotedTranscoder t(job.events, &job.task);
-        t.setParam("progress", AnyDict("off", 1));
-        EXPECT_EQ(t.transcode(true), 0);
-        EXPECT_TRUE(job.events.take().starts_with(samples ? "open open a2000" : "open open close done0"));
-        EXPECT_EQ(job.pipe.audios[0]->total, samples);
-    }
 }
 
 // How a run ends and who gets to know what.
@@ -78,8 +53,6 @@ TEST_F(Transcoder, EveryEndHasItsOwnResult) {
          -78, -1, "close done-78"},
         {"left open", [](LinkedJob& j) { j.t.setParam("closeEncoder", 0); }, 0, 0, "0.50 done0"},
         {"throw", [](LinkedJob& j) { j.t.onProcess = []() -> int { throw 5; }; }, -1, -1, "abort done-1"},
-        {"assert", [](LinkedJob& j) { j.t.onProcess = [&j] { return j.t.pause(); }; }, -1, -1,
-         "abort done-1"},
     };
     for (const auto& row : rows) {
         SCOPED_TRACE(row.what);
@@ -127,87 +100,6 @@ TEST_F(Transcoder, WhatCantBeOpenedIsToldAndCanBeMended) {
         }
 }
 
-TEST_F(Transcoder, MisuseAsserts) {
-    Events events;
-    NotedTranscoder idle(events);
-    EXPECT_EQ(idle.getState(), QvTranscoder::notConnected);
-    EXPECT_EQ(idle.stop(), 0);
-    EXPECT_EQ(failureOf([&] { idle.transcode(true); }), "Transcoder.transcode: Encoder not set!");
-    EXPECT_EQ(failureOf([&] { idle.linkAll(); }), "Transcoder.linkAll: decoder and/or encoder not specified");
-    EXPECT_EQ(failureOf([&] { idle.pause(); }),
-              "Transcoder: must not call pause/unpause() in synchronous mode.");
-    EXPECT_EQ(failureOf([&] { idle.filter(1, 0, "scaler", 0); }),
-              "QvTranscoder::filter has to be called from the cbProgress() or cbProcess()");
-    LinkedJob job;
-    auto& busy = job.t;
-    int asserted = 0;
-    busy.onProcess = [&] {
-        for (const auto& work : std::vector<std::function<void()>>{
-                 [&] { busy.setEncoder(&job.pipe); }, [&] { busy.setDecoder(&job.decoder); },
-                 [&] { busy.linkAll(); }, [&] { busy.unlink(); }, [&] { busy.transcode(false); },
-                 [&] { busy.transcode(idle.task(), true); }, [&] { busy.pause(); }, [&] { busy.unpause(); },
-                 [&] { busy.link(&job.decoder, 1, 0, 0); }})
-            asserted += failureOf(work) != "no failure";
-        EXPECT_EQ(busy.filter(1, 0, "scaler", 0), nullptr);
-        EXPECT_EQ(busy.filter(1, 7, "scaler", 0), nullptr);
-        return 0;
-    };
-    EXPECT_EQ(busy.transcode(true), 0);
-    EXPECT_EQ(asserted, 2 * 9);
-    EXPECT_EQ(busy.task(), &job.task);
-}
-
-TEST_F(Transcoder, LinksAreMadeThroughItsTask) {
-    Job job;
-    NotedTranscoder t(job.events);
-    t.setEncoder(&job.pipe);
-    t.setDecoder(&job.decoder);
-    EXPECT_EQ(t.linkAll(), 0);
-    EXPECT_EQ(t.nrLinks(), 2);
-    EXPECT_EQ(t.link(&job.decoder, 1, 0, 1), -1);
-    EXPECT_NE(std::string(t.errorDesc()).find("already linked to encoder video#0"), std::string::npos);
-    FakeDecoder sound(2, QvFramerate::f25p());
-    sound.audio(3840, 48000);
-    t.setAudioDecoder(&sound);
-    EXPECT_EQ(t.getState(), QvTranscoder::notConnected);
-    EXPECT_EQ(t.linkAll(), 0);
-    EXPECT_EQ(t.linkedTo(&sound, 2, 0), 0);
-    EXPECT_EQ(t.linkedTo(&job.decoder, 2, 0), -1);
-    EXPECT_EQ(t.transcode(true), 0);
-}
-
-TEST_F(Transcoder, Parameters) {
-    LinkedJob job;
-    EXPECT_THROW(job.t.setParam("colour", 1), QvParamException);
-    LogCapture log;
-    EXPECT_EQ(job.t.setParam("chapters", 5), 0);
-    EXPECT_TRUE(
-        log.contains("Transcoder: Setting global 'chapterPoints', using ProcessParams is recommended.",
-                     QvLogMask::warning));
-    const AnyVector matrix(1, 2);
-    const struct {
-        const char* name;
-        Any set, got;
-    } rows[] = {
-        {"connMatrix", matrix, matrix}, {"progress", AnyDict("each", 1), AnyDict("each", 1)},
-        {"progress", 1, AnyDict()},     {"secondPass", Any(), 0},
-        {"deadLock", Any(), 0},         {"srPossible", Any(), 0},
-        {"writeLogfile", Any(), 0},     {"twoPass", 1, 1},
-        {"secondPass", Any(), 1},
-    };
-    for (const auto& row : rows) {
-        if (row.set.isValid()) {
-            EXPECT_EQ(job.t.setParam(row.name, row.set), 0);
-        }
-        Any value;
-        job.t.getParam(row.name, value);
-        if (row.got.isInt())
-            EXPECT_EQ(value.isTrue(), row.got.isTrue()) << row.name;
-        else
-            EXPECT_EQ(value, row.got) << row.name;
-    }
-}
-
 TEST_F(Transcoder, ALogFileHoldsTheMessagesOfTheRunAlone) {
     TempFolder folder;
     LinkedJob job;
@@ -238,16 +130,6 @@ TEST_F(Transcoder, AFullDiscIsLoggedAndEndsOnlyARunThatWatchesIt) {
 }
 
 // --- On a worker -------------------------------------------------------------------------------------
-
-TEST_F(Transcoder, AWorkerDoesTheSameWork) {
-    LinkedJob job;
-    for (int run = 0; run < 2; ++run) {
-        EXPECT_EQ(job.t.transcode(false), 0);
-        job.events.waitFor("done0");
-        job.t.stop();
-        EXPECT_EQ(job.events.take(), "open open v0 a1920 0.00 v1 a1920 0.50 close done0");
-    }
-}
 
 TEST_F(Transcoder, PausesBetweenSteps) {
     LinkedJob job(1000000);
@@ -337,32 +219,6 @@ TEST_F(Transcoder, WithoutAThreadNothingHangs) {
     job.events.take();
     EXPECT_EQ(job.t.transcode(false), 0);
     job.events.waitFor("done0");
-}
-
-TEST_F(Transcoder, ABorrowedTaskIsGivenBack) {
-    LinkedJob job;
-    Job other;
-    other.linkBoth();
-    EXPECT_EQ(job.t.transcode(&other.task, true), 0);
-    EXPECT_EQ(job.t.task(), &job.task);
-    EXPECT_EQ(other.pipe.audios[0]->total, 3840);
-
-    job.t.onDone = [&] { EXPECT_EQ(job.t.task(), &other.task); };
-    EXPECT_EQ(job.t.transcode(&other.task, false), 0);
-    job.t.stop();
-    EXPECT_EQ(job.t.task(), &job.task);
-    job.t.onDone = nullptr;
-
-    other.pipe.openResult = -1;
-    for (const bool synchronous : {true, false}) EXPECT_EQ(job.t.transcode(&other.task, synchronous), -1);
-    other.task.setEncoder(nullptr);
-    EXPECT_NE(failureOf([&] { job.t.transcode(&other.task, true); }), "no failure");
-    NoThreads none;
-    PlatformScope scope(none);
-    other.task.setEncoder(&other.pipe);
-    other.pipe.openResult = 0;
-    EXPECT_EQ(job.t.transcode(&other.task, false), -1);
-    EXPECT_EQ(job.t.task(), &job.task);
 }
 
 }  // namespace

@@ -2,14 +2,10 @@
 
 #include "builtin/modules.h"
 #include "core/filter/qvprocesspipe.h"
-#include "core/stream/qvbuffifo.h"
 #include "core/transcode/translink.h"
 #include "tests/support/checks.h"
 #include "tests/support/fake_filters.h"
-#include "tests/support/fake_muxer.h"
 #include "tests/support/fake_streams.h"
-#include "tests/support/log_capture.h"
-#include "tests/support/temp_folder.h"
 
 namespace {
 
@@ -113,8 +109,6 @@ TEST(TransVLink, FailuresComeOut) {
     } rows[] = {
         {[](Job& j) { j.params.set("inOutPoints", pointsOf(MediaTime(0.2), MediaTime(0.1))); }, -1, 0,
          "The out point does not lie behind the in point"},
-        {[](Job& j) { j.decoder.video.set("framerate", Any()); }, -1, 0, ""},
-        {[](Job& j) { j.decoder.video.set("framerate", Any(QvFramerate(QvRatio(0, 1)))); }, -1, 0, ""},
         {[](Job& j) { j.decoder.video.set("framerate", Any(QvFramerate(QvRatio(25, 0)))); }, -1, 0, ""},
         {[](Job& j) {
              qv_registry()->cleanup();
@@ -140,28 +134,13 @@ TEST(TransVLink, FailuresComeOut) {
     }
 }
 
-TEST(TransVLink, MisuseIsRefused) {
-    Job job(10);
-    EXPECT_EQ(job.link.init(&job.decoder, 0, &job.encoder, 1), -1);
-    EXPECT_THROW(job.link.init(&job.decoder, 0, &job.encoder, -1), QvAssertFailure);
-    job.params.set("startFrame", 1);
-    EXPECT_THROW(job.open(), QvAssertFailure);
-    job.params.clear();
-    ASSERT_EQ(job.open(), 0);
-    EXPECT_EQ(job.link.open(nullptr), -1);
-    job.decoder.isOn = false;
-    EXPECT_THROW(job.link.init(&job.decoder, 0, &job.encoder, 0), QvAssertFailure);
-}
-
 TEST(TransVLink, TruncatedInputEndsWithoutError) {
-    LogCapture log;
     Job job(10);
     job.decoder.truncatedAt = 4;
     ASSERT_EQ(job.open(), 0);
     EXPECT_EQ(job.run(), 0);
     EXPECT_EQ(job.encoder.video.numbers, range(0, 4));
     EXPECT_EQ(job.link.outProcessed(), 5);  // the step that found the end counts
-    EXPECT_TRUE(log.contains("frames out: 5 (10 expected), frames in: 10."));
 }
 
 TEST(TransVLink, RepeatsTheLastFrameForAnEvenCount) {
@@ -198,9 +177,6 @@ TEST(TransVLink, HalvedRateTakesAnEvenNumberOfFramesAndMovesTheChapters) {
 }
 
 TEST(TransVLink, FiltersHearHowManyFramesTheyWillSee) {
-    LogCapture log;
-    TransVLink().log();
-    EXPECT_TRUE(log.contains("missing components"));
     Job job(50, f25, f50);
     job.encoder.video.params.set("width", 32);
     const auto at = [](const char* name, int front, int position) {
@@ -216,8 +192,6 @@ TEST(TransVLink, FiltersHearHowManyFramesTheyWillSee) {
     EXPECT_EQ(total("scaler", 0), 50);
     EXPECT_EQ(total("frconvert", 0), -1);
     EXPECT_EQ(total("videofade", 1), 100);
-    job.link.log();
-    EXPECT_TRUE(log.contains("1. videofade"));
     // A bobber makes two frames of one, before them or behind.
     job.link.close();
     job.params.set("effects", customFilters(AnyVector(at("bobber", 1, 1), early, late, at("bobber", 0, 2))));
@@ -247,24 +221,6 @@ TEST(TransVLink, ChoosesAFormatThatTheEncoderTakes) {
         if (scaler) {
             EXPECT_EQ(scaler->getParam("FOURCC"), Any(static_cast<int>(row.chosen)));
         }
-    }
-}
-
-TEST(TransVLink, CaptionsComeFromTheMetaSourceAndAreReadOnce) {
-    for (const bool own : {false, true}) {
-        Job job(4);
-        FakeDecoder other(4, f25);
-        FakeDecoder& captions = own ? job.decoder : other;
-        captions.captionEvery = 2;
-        MetaProcessParams params;
-        params.setCcMode(true, false, 1, false, false);
-        ASSERT_EQ(job.link.addMetaSource(&captions, own ? 1 : 4, 0, params), 0);
-        EXPECT_EQ(job.link.metaSource(0), &captions);
-        ASSERT_EQ(job.open(), 0);
-        EXPECT_EQ(job.run(), 0);
-        EXPECT_EQ(job.encoder.video.numbers, range(0, 4));
-        EXPECT_EQ(job.encoder.video.captions, (std::vector<int>{0, -1, 2, -1}));
-        EXPECT_EQ(job.encoder.video.params.get("ccMode").asDict().getInt32("do608"), 1);
     }
 }
 
@@ -315,78 +271,6 @@ TEST(TransVLink, WhatBarsSmartRendering) {
         ASSERT_EQ(job.open(), 0);
         EXPECT_EQ(job.isSmart(), row.smart) << row.what;
     }
-}
-
-TEST(TransVLink, WritesWhatTheEncoderTellsOfItsFrames) {
-    TempFolder folder;
-    LogCapture log;
-    QvBufStreamFifo stream;
-    ASSERT_EQ(stream.init(AnyDict("size", 4096, "chunk", 1024)), 0);
-    FakeMuxer muxer("rawmux", &stream);
-    Job job(3);
-    QvEncodingQualityStatsSetup setup;
-    setup.addLog(Any(folder.file("q.txt").c_str()));
-    job.params.set("qualityStats", static_cast<const AnyVector&>(setup));
-    job.encoder.video.refused.set("getQualityStats", 1);
-    ASSERT_EQ(job.open(), 0);
-    EXPECT_TRUE(log.contains("does not support PSNR logging.", QvLogMask::error));
-    job.link.close();
-    job.encoder.video.refused.clear();
-    ASSERT_EQ(job.open(), 0);  // without a multiplexer
-    EXPECT_TRUE(log.contains("Can not start logging.", QvLogMask::error));
-    EXPECT_EQ(job.encoder.video.params.getInt32("getQualityStats", -1), 0);
-    job.link.close();
-
-    job.encoder.muxer = &muxer;
-    ASSERT_EQ(job.open(), 0);
-    const auto tell = [&](std::vector<double> values, unsigned bytes) {
-        auto* bs = stream.input();
-        bs->auxinfo(bs, 0, QvAuxId::STATISTIC_INFO, values.data(),
-                    static_cast<unsigned>(values.size() * sizeof(double)));
-        bs->auxinfo(bs, 0, QvAuxId::VIDEO_AU_CODE, &bytes, sizeof bytes);
-    };
-    tell({40.5, 41.0, 42.25}, 1000);
-    tell({}, 20);
-    job.link.close();
-    EXPECT_EQ(TempFolder::read(folder.file("q.txt")), "0\t1000\t40.5000\t41.0000\t42.2500\n1\t20\n");
-    EXPECT_EQ(job.encoder.video.params.getInt32("getQualityStats", -1), 0);
-    tell({1.0}, 5);  // nobody listens any more
-}
-
-TEST(TransVLink, TheFirstFrameBecomesTheIcon) {
-    TempFolder folder;
-    FakeMuxer muxer("rawmux");
-    muxer.params = AnyDict("needBMP", 1, "filename", folder.file("clip.mov").c_str());
-    Job job(3);
-    job.decoder.video.set("FOURCC", static_cast<int>(QvFourcc::BGR3));
-    job.encoder.video.params.set("inFOURCC", fourccs({QvFourcc::BGR3}));
-    job.encoder.muxer = &muxer;
-    ASSERT_EQ(job.open(), 0);
-    EXPECT_EQ(job.run(), 0);
-    EXPECT_EQ(TempFolder::read(folder.file("clip.BMP")).substr(0, 2), "BM");
-}
-
-TEST(TransVLink, TakesOnlyTheParametersThatAreThere) {
-    TransVLink link;
-    ProcessParams first, second;
-    first.setInOutPoints(InOutPoints(MediaTime(1.0), MediaTime(2.0)));
-    first.setSmartRender(1);
-    second.setChapterPoints(AnyVector(1, 2));
-    link.setProcessParams(first);
-    link.setProcessParams(second);
-    ASSERT_TRUE(link.processParams().inOutPoints());
-    EXPECT_TRUE(link.processParams().chapterPoints());
-    EXPECT_EQ(link.processParams().smartRender(), 0);
-}
-
-TEST(TransVLink, ACopyIsAClosedLinkOverTheSameStreams) {
-    Job job(4);
-    FakeDecoder captions(4, f25);
-    job.link.addMetaSource(&captions, 4, 0, {});
-    ASSERT_EQ(job.open(), 0);
-    TransVLink copy = job.link;
-    EXPECT_EQ(copy.nrMetaSources(), 1);
-    EXPECT_EQ(copy.open(nullptr), 0);
 }
 
 }  // namespace
