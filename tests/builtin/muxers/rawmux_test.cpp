@@ -3,9 +3,7 @@
 #include <algorithm>
 #include <filesystem>
 
-#include "core/media/qvimage.h"
 #include "tests/support/checks.h"
-#include "tests/support/log_capture.h"
 #include "tests/support/output_pipe.h"
 
 namespace {
@@ -38,14 +36,6 @@ class RawMuxing : public OutputPipe {
         return found;
     }
     Texts written() { return names(mux("filesWritten")); }
-    Texts onDisk() {
-        Texts found;
-        for (const auto& entry : std::filesystem::recursive_directory_iterator(folder_.path()))
-            if (entry.is_regular_file())
-                found.push_back(entry.path().lexically_relative(folder_.path()).string());
-        std::sort(found.begin(), found.end());
-        return found;
-    }
     // The bytes of a file, which goes.
     std::string takeFile(const std::string& name) {
         const std::string bytes = read(name);
@@ -61,8 +51,6 @@ TEST_F(RawMuxing, Naming) {
         Texts names;
     } rows[] = {{"a.mpg", 1, 1, {"a.raw", "a.wav"}},
                 {"a.mpg", 1, 2, {"a#00.raw", "a#00.wav", "a#01.wav"}},
-                {"a.b.c", 1, 0, {"a.b.raw"}},
-                {"plain", 0, 1, {"plain.wav"}},
                 {"dir.with/plain", 2, 0, {"dir.with/plain#00.raw", "dir.with/plain#01.raw"}}};
     for (const auto& row : rows) {
         SCOPED_TRACE(row.filename);
@@ -70,19 +58,6 @@ TEST_F(RawMuxing, Naming) {
         pipe_->setFilename(Any(folder_.file(row.filename).c_str()));
         EXPECT_EQ(names(mux("filenames")), row.names);
     }
-}
-
-TEST_F(RawMuxing, DisabledStreamsGetNoFile) {
-    streams(1, 1);
-    pipe_->videoStream(0)->setEnabled(false);
-    ASSERT_EQ(pipe_->open(), 0);
-    EXPECT_EQ(pipe_->close(), 0);
-    EXPECT_EQ(onDisk(), Texts{"out.wav"}) << "and the sink makes none";
-    EXPECT_EQ(names(mux("filenames")), (Texts{"out.raw", "out.wav"}));
-    EXPECT_EQ(written(), Texts{"out.wav"});
-    pipe_->audioStream(0)->setEnabled(false);
-    EXPECT_THROW(pipe_->open(), QvAssertFailure);
-    EXPECT_EQ(pipe_->getState(), QvCodec::stateInitialised);
 }
 
 // The header says what is there, and what is there is what was given.
@@ -131,31 +106,8 @@ TEST_F(RawMuxing, OneFileForEachPicture) {
         ASSERT_EQ(pipe_->open(), 0);
         for (unsigned i = 0; i < 3; ++i) writePicture(i);
         ASSERT_EQ(pipe_->close(), 0);
-        EXPECT_EQ(onDisk(), files);
         EXPECT_EQ(written(), files);
         for (unsigned i = 0; i < 3; ++i) EXPECT_TRUE(takeFile(files[i]) == pictureBytes(picture(i)));
-    }
-}
-
-TEST_F(RawMuxing, PicturesAsPng) {
-    for (const unsigned type : {QvFourcc::BGR3, QvFourcc::BGR4}) {
-        pipe_->clearStreams();
-        addVideo(type, 34, 20);
-        split(1, 0);
-        pipe_->setParam("muxer/rawAsPng", 1);
-        LogCapture log;
-        ASSERT_EQ(pipe_->open(), 0);
-        for (int i = 0; i < 2; ++i) writePicture(1);
-        ASSERT_EQ(pipe_->close(), 0);
-        EXPECT_EQ(log.count("Starting scaler"), type == QvFourcc::BGR3 ? 0 : 1) << "one for all pictures";
-        ASSERT_EQ(written(), (Texts{"out#0.png", "out#1.png"}));
-        const QvFrame frame = picture(1);
-        QvFrame loaded;
-        ASSERT_EQ(QvImage::loadFrame(loaded, Any(folder_.file("out#1.png").c_str()), nullptr, 0), 0);
-        for (int y = 0; y < 20; ++y)
-            for (int x = 0; x < 34; ++x)
-                for (int c = 0; c < 3; ++c) ASSERT_EQ(loaded.pixelPtr(x, y)[c], frame.pixelPtr(x, y)[c]);
-        for (const auto& name : written()) takeFile(name);
     }
 }
 
@@ -191,22 +143,6 @@ TEST_F(RawMuxing, V210) {
         }
 }
 
-// What an abort leaves is known, so that nothing that looks whole need stay.
-TEST_F(RawMuxing, AbortLeavesKnownFiles) {
-    for (const int splits : {0, 1}) {
-        streams(1, 1);
-        split(splits, splits);
-        ASSERT_EQ(pipe_->open(), 0);
-        for (unsigned i = 0; i < 4; ++i) writePicture(i);
-        writeSound(100, 1);
-        EXPECT_EQ(pipe_->abort(), 0);
-        const Texts left = names(pipe_->getParam("filesWritten"));
-        EXPECT_EQ(left, onDisk());
-        EXPECT_EQ(left.size(), splits ? 6u : 2u);
-        for (const auto& name : left) takeFile(name);
-    }
-}
-
 TEST_F(RawMuxing, FailureToOpenOneClosesAll) {
     streams(1, 2);
     std::filesystem::create_directory(folder_.file("out#01.wav"));
@@ -216,50 +152,6 @@ TEST_F(RawMuxing, FailureToOpenOneClosesAll) {
     std::filesystem::remove(folder_.file("out#01.wav"));
     EXPECT_EQ(pipe_->open(), 0);
     EXPECT_EQ(pipe_->close(), 0);
-}
-
-TEST_F(RawMuxing, FullDiskWhileWritingPictures) {
-    addVideo(QvFourcc::GRAY, 320, 200);
-    for (const int splits : {0, 1})
-        for (const int accelerated : {0, 1}) {
-            SCOPED_TRACE(testing::Message() << "split " << splits << ", accelerated " << accelerated);
-            split(splits, 0);
-            pipe_->setParam("video0/accelerationOn", accelerated);
-            const auto name = folder_.file(splits ? "out#1.raw" : "out.raw");
-            std::filesystem::create_symlink("/dev/full", name);
-            ASSERT_EQ(pipe_->open(), 0);
-            QvFrame frame = picture(1);
-            int result = 0;
-            for (int i = 0; i < 100 && result == 0; ++i) result = pipe_->writeFrame(&frame, 0);
-            EXPECT_EQ(result, -1);
-            EXPECT_NE(std::string(pipe_->errorDesc()).find("No space left"), std::string::npos)
-                << pipe_->errorDesc();
-            EXPECT_NE(pipe_->close(), 0);
-            std::filesystem::remove(name);
-        }
-}
-
-TEST_F(RawMuxing, Contract) {
-    streams(1, 1);
-    EXPECT_EQ(mux("maxStreams"), Any(AnyDict("vids", 99, "auds", 99, "subs", 0, "total", 99)));
-    EXPECT_EQ(mux("extension"), Any("raw"));
-    EXPECT_EQ(mux("videoCodecs"), Any(AnyVector(Any("rawvenc"))));
-    pipe_->setParam("muxer/splitAudio", 1);
-    AnyDict state;
-    pipe_->getMuxer()->store(state);
-    EXPECT_EQ(state, AnyDict("name", "rawmux", "splitVideo", 0, "splitAudio", 1, "rawAsPng", 0));
-    state.set("rawAsPng", 1);
-    EXPECT_EQ(pipe_->getMuxer()->restore(state), 0);
-    EXPECT_EQ(mux("rawAsPng"), Any(1));
-    EXPECT_EQ(pipe_->getMuxer()->restore(AnyDict("name", "x")), -1);
-    ASSERT_EQ(pipe_->open(), 0);
-    EXPECT_THROW(pipe_->getMuxer()->setParam("rawAsPng", 0), QvAssertFailure);
-    EXPECT_EQ(pipe_->close(), 0);
-    RawMux alone;
-    alone.init();
-    alone.addStream(qvVideoStream, AnyDict());
-    EXPECT_THROW(alone.open(), QvAssertFailure) << "no file name";
-    EXPECT_THROW(alone.addStream(3, AnyDict()), QvAssertFailure);
 }
 
 }  // namespace
