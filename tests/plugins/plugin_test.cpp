@@ -8,6 +8,7 @@
 #include "core/engine/qvmodule.h"
 #include "core/engine/qvplugin.h"
 #include "core/engine/qvregistry.h"
+#include "core/filter/qvfilter.h"
 #include "core/media/qvbuffer.h"
 #include "tests/support/checks.h"
 
@@ -52,7 +53,7 @@ TEST_F(Plugins, ScanFindsModulesByExtensionNameAndKind) {
     EXPECT_EQ(registry.decoders("pcm8"), AnyVector(Any("pcm8dec")));
 }
 
-TEST_F(Plugins, DecoderDoesItsWork) {
+TEST_F(Plugins, DecoderAndFilterDoTheirWork) {
     load(bring("pcm8_plugin.so"));
     const std::string sound = folder.write("sound.pcm8", std::string("\x80\xFF\x01", 3));
     const std::unique_ptr<QvDecodePipe> decoder(QvDecFactory::decodePipe(narrow(sound)));
@@ -62,6 +63,17 @@ TEST_F(Plugins, DecoderDoesItsWork) {
     EXPECT_EQ(decoder->readSamples(2, 0), 2);
     EXPECT_EQ(decoder->getAudioPtr(0)->ptr(1)[0], 0xFF);
     for (const int left : {1, -4}) EXPECT_EQ(decoder->readSamples(2, 0), left);
+
+    const std::unique_ptr<QvCodec> codec(registry.newCodec("polarity"));
+    ASSERT_TRUE(codec);
+    auto* filter = static_cast<QvAudioFilter*>(codec->getInterface(QvModuleType::audioFilter));
+    QvPcm pcm;
+    pcm.init(2, 1, 4, 48000);
+    const int values[] = {1000, -2147483647 - 1};
+    pcm.write(2, reinterpret_cast<const unsigned char*>(values));
+    ASSERT_TRUE(filter->write(pcm) == 0 && filter->samples() == 2);
+    const auto* inverted = reinterpret_cast<const int*>(filter->pcm()->ptr(0));
+    EXPECT_TRUE(inverted[0] == -1000 && inverted[1] == 2147483647);
 }
 
 TEST_F(Plugins, BadFilesLeaveNothingButALine) {
