@@ -8,14 +8,9 @@ namespace {
 class BadInput : public Tool {};
 
 TEST_F(BadInput, OneLineAndTheRightStatus) {
-    makeWav("none.wav", 100, 0);
     folder.write("empty.wav", "");
     folder.write("text.wav", "this is a letter and no sound\n");
-    folder.write("riff.wav", riff(""));
-    folder.write("nodata.wav", riff(wavChunk("fmt ", wavFormat(1, 2, 44100, 16))));
     folder.write("alaw.wav", riff(wavChunk("fmt ", wavFormat(6, 1, 8000, 8)) + wavChunk("data", "abcd")));
-    folder.write("bits.wav", riff(wavChunk("fmt ", wavFormat(1, 1, 8000, 13)) + wavChunk("data", "abcd")));
-    folder.write("rate.wav", riff(wavChunk("fmt ", wavFormat(1, 1, 0, 16)) + wavChunk("data", "abcd")));
     folder.write("plain", "x");
     folder.write("odd.xyz", "x");
     makeYuv("clip.yuv", 1);
@@ -26,19 +21,12 @@ TEST_F(BadInput, OneLineAndTheRightStatus) {
         std::vector<std::string> parts;
     } cases[] = {
         {"absent.wav", {"no such file"}},
-        {"no/such/folder.wav", {"no such file"}},
         {"empty.wav/below.wav", {"can't open"}},
         {"folder.wav", {"this is a folder"}},
-        {"folder.wav/", {"this is a folder"}},
         {"empty.wav", {"the file is empty"}},
         {"fifo.wav", {"no regular file"}},
         {"text.wav", {"WAV"}},
-        {"riff.wav", {"WAV"}},
-        {"nodata.wav", {"WAV"}},
-        {"none.wav", {"WAV"}},
         {"alaw.wav", {"WAV"}},
-        {"bits.wav", {"WAV"}},
-        {"rate.wav", {"WAV"}},
         {"plain", {"'plain'", "tarsel formats"}},
         {"odd.xyz", {"'xyz'", "tarsel formats"}},
         {"clip.yuv", {"--raw"}},
@@ -53,7 +41,6 @@ TEST_F(BadInput, OneLineAndTheRightStatus) {
     makeWav("good.wav", 10);
     fails(3, {"transcode", "good.wav", "absent.wav", "-o", "out.wav"}, {"'absent.wav'"});
     fails(3, {"transcode", "good.wav", "-o", "out.yuv"}, {"no input has a picture", "'out.yuv'"});
-    fails(3, {"transcode", "good.wav", "-o", "out.png"}, {"no input has a picture", "'out.png'"});
     fails(3, asYuv({"transcode", "clip.yuv", "-o", "out.wav"}), {"no input has sound", "'out.wav'"});
     fails(3, {"frame", "good.wav", "-o", "out.png"}, {"'good.wav' has no picture"});
 }

@@ -17,7 +17,6 @@ TEST_F(Examples, CopySound) {
     EXPECT_EQ(o.status, 0) << o.err;
     EXPECT_TRUE(wavPart(contents("take.wav"), "data") == wavPart(contents("copy.wav"), "data"));
     EXPECT_EQ(runProgram({program, "absent.wav", "x.wav"}, here()).status, 1);
-    EXPECT_EQ(runProgram({program}, here()).status, 2);
 }
 
 // The example of how to add a module, through the tool: its decoder opens what nothing else does.
@@ -32,17 +31,6 @@ TEST_F(Examples, PluginThroughTheTool) {
     EXPECT_EQ(o.err, "tarsel: wrote 'tone.wav', 5000 samples\n");
     EXPECT_TRUE(wavPart(contents("tone.wav"), "data") == sound);
     EXPECT_THAT(tarsel({"--plugins", "plugins", "modules"}).out, HasSubstr("polarity"));
-    const std::vector<std::string> turn = {"--plugins", "plugins",  "transcode", "tone.pcm8",
-                                           "--filter",  "polarity", "-o",        "turned.wav"};
-    if (!isUsable("aquant")) return fails(5, turn, {"'aquant'"});  // between 8 bits and the filters' 32
-    works(turn);
-    const std::string turned = wavPart(contents("turned.wav"), "data");
-    ASSERT_EQ(turned.size(), sound.size());
-    for (size_t i = 0; i < sound.size(); ++i) {
-        const int value = static_cast<unsigned char>(sound[i]) - 128;
-        const int other = static_cast<unsigned char>(turned[i]) - 128;
-        ASSERT_NEAR(other, std::min(-value, 127), 1) << i;
-    }
     EXPECT_THAT(tarsel({"--plugins", "none", "modules"}).err, HasSubstr("'none'"));
 }
 

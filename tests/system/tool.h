@@ -11,8 +11,6 @@
 #include <string>
 #include <vector>
 
-#include <nlohmann/json.hpp>
-
 #include "tests/support/process.h"
 #include "tests/support/temp_folder.h"
 #include "tests/support/wav_bytes.h"
@@ -55,13 +53,6 @@ class Tool : public testing::Test {
         EXPECT_EQ(o.err.rfind("tarsel: ", 0), 0u) << o.err;
         EXPECT_THAT(o.err, testing::Not(testing::HasSubstr(".tarsel-"))) << "a hidden name";
         for (const auto& part : parts) EXPECT_THAT(o.err, testing::HasSubstr(part)) << what;
-    }
-
-    bool isUsable(const std::string& module) const {
-        const Outcome o = tarsel({"modules", "--json"});
-        for (const auto& row : nlohmann::json::parse(o.out))
-            if (row["name"] == module) return row["usable"].get<bool>();
-        return false;
     }
 
     std::set<std::string> listing() const {

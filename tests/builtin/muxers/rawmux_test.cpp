@@ -62,7 +62,7 @@ TEST_F(RawMuxing, Naming) {
 
 // The header says what is there, and what is there is what was given.
 TEST_F(RawMuxing, WavHoldsExactlyTheSamples) {
-    for (const unsigned bits : {8, 16, 24})
+    for (const unsigned bits : {8U, 16U, 24U})
         for (unsigned channels = 1; channels <= 8; ++channels)
             for (const int splits : {0, 1}) {
                 SCOPED_TRACE(testing::Message() << channels << " of " << bits << " bits, split " << splits);
