@@ -34,7 +34,7 @@ constexpr size_t pci = 14 + 24 + 6 + 1;
 constexpr size_t dsi = pci + 979 + 6 + 1;
 constexpr size_t dsiSearch = dsi + 0xEA;
 constexpr size_t nextVideo = dsiSearch, previousVideo = dsiSearch + 0xA4;
-constexpr size_t nextVobu = dsiSearch + 0x50, previousVobu = dsiSearch + 0x54;
+constexpr size_t nextVobu = dsiSearch + 0x50;
 constexpr size_t dsiSynch = dsi + 0x192;
 
 class Pack {

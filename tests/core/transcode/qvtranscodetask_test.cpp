@@ -169,7 +169,7 @@ TEST(TaskState, DamageIsToldAndNothingIsLeft) {
         row.damage(stored);
         const std::string text = stored.restore();
         EXPECT_NE(text, "no failure");
-        if (row.text != "") {
+        if (!row.text.empty()) {
             EXPECT_EQ(text, row.text);
         }
         EXPECT_FALSE(stored.task);
