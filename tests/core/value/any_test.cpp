@@ -146,8 +146,6 @@ TEST(Any, equalityNeedsTypeSizeAndValue) {
     EXPECT_NE(Any("ab"), Any("abc"));
     EXPECT_NE(Any(static_cast<const void*>("ab"), 2), Any(static_cast<const void*>("ac"), 2));
     EXPECT_NE(Any(MediaTime(1, 25)), Any(MediaTime(2, 50)));
-
-    const unsigned short wide[] = {'a', 0};
 }
 
 TEST(Any, orderGoesByTypeOnlyForLess) {
