@@ -9,7 +9,6 @@
 #include "core/value/anycontainer.h"
 #include "tests/builtin/video/effect_frames.h"
 #include "tests/support/engine.h"
-#include "tests/support/log_capture.h"
 #include "tests/support/temp_folder.h"
 
 namespace {
@@ -102,19 +101,6 @@ class Logos : public testing::Test {
     std::string png_ = folder_.file("disc.png");
 
     void SetUp() override { writePng(disc_, png_); }
-    // A movie of three frames, each with the disc one pixel further to the right, as raw BGRA.
-    std::string movie() const {
-        std::string bytes;
-        for (int i = 0; i < 3; ++i) {
-            QvFrame frame;
-            frame.init(QvFourcc::BGRA, 24, 21);
-            frame.setBlack();
-            frame.clip(disc_, 0, 0, i, 0, 21, 21);
-            bytes += pictureBytes(frame);
-        }
-        return folder_.write("disc.bgra", bytes);
-    }
-    static constexpr const char* movieFormat = "FOURCC=BGRA;width=24;height=21";
 };
 
 }  // namespace
@@ -124,9 +110,8 @@ TEST_F(Logos, EveryFormatLooksAsMixedInRgb) {
         int x, y, left, top;
         double opacity;
     } const places[] = {
-        {10, 6, 10, 6, 1},   {11, 7, 11, 7, 0.6},   {-1, -2, 52 - 21 - 1, 40 - 21 - 2, 1},
-        {-45, 0, -14, 0, 1}, {45, 30, 45, 30, 0.3}, {-41, -31, -10, -12, 1},
-        {60, 10, 60, 10, 1}, {0, 400, 0, 400, 1},   {51, 39, 51, 39, 1},
+        {11, 7, 11, 7, 0.6}, {-1, -2, 52 - 21 - 1, 40 - 21 - 2, 1}, {45, 30, 45, 30, 0.3},
+        {-41, -31, -10, -12, 1}, {60, 10, 60, 10, 1},
     };
     for (const auto& format : qvPixelFormats())
         for (const auto& place : places) {
@@ -190,21 +175,22 @@ TEST_F(Logos, FilesThatAreNoLogo) {
         EXPECT_EQ(animated.open(), -1) << name;
         EXPECT_NE(std::string(animated.errorDesc()).find("movie"), std::string::npos) << animated.errorDesc();
     }
-    AnimatedLogo animated;
-    animated.init();
-    animated.setParam("filename",
-                      folder_.write("x.srt", "1\n00:00:00,000 --> 00:00:01,000\nHello\n").c_str());
-    const LogCapture log;
-    EXPECT_EQ(animated.open(), -1);
-    EXPECT_TRUE(log.contains("[animated logo] no video streams in file")) << animated.errorDesc();
 }
 
 TEST_F(Logos, MoviesRunFrameByFrame) {
-    const std::string name = movie();
+    std::string bytes;  // three frames, each with the disc one pixel further to the right
+    for (int i = 0; i < 3; ++i) {
+        QvFrame frame;
+        frame.init(QvFourcc::BGRA, 24, 21);
+        frame.setBlack();
+        frame.clip(disc_, 0, 0, i, 0, 21, 21);
+        bytes += pictureBytes(frame);
+    }
+    const std::string name = folder_.write("disc.bgra", bytes);
     for (const int loop : {0, 1}) {
         Animated logo({{"filename", name.c_str()},
                        {"decoder", "rawdec"},
-                       {"decoderParams", movieFormat},
+                       {"decoderParams", "FOURCC=BGRA;width=24;height=21"},
                        {"xpos", 4},
                        {"ypos", 2},
                        {"alpha", 0.8},
@@ -217,29 +203,4 @@ TEST_F(Logos, MoviesRunFrameByFrame) {
         }
         logo.close();
     }
-}
-
-TEST_F(Logos, MoviesAreScaledAndCoverWithoutAlpha) {
-    // Twice as large a disc is what it is when drawn so, but for its edge.
-    const std::string name = movie();
-    Animated twice({{"filename", name.c_str()},
-                    {"decoder", "rawdec"},
-                    {"decoderParams", movieFormat},
-                    {"scale", 200},
-                    {"xpos", -10},
-                    {"ypos", -4}});
-    QvFrame in = mixed(nullptr, 0, 0, 0, 100, 80);
-    const QvFrame& out = twice.through(in);
-    const int left = 100 - 48 - 10, top = 80 - 42 - 4;
-    EXPECT_NEAR(out.pixelPtr(left + 21, top + 21)[2], 255 * 10 / 21, 14);
-    EXPECT_EQ(out.pixelPtr(left + 21, top + 21)[1], 30);
-    for (int y = 0; y < 80; ++y)
-        for (int x = 0; x < 100; ++x)
-            EXPECT_LE(out.pixelPtr(x, y)[1], 92) << "no green of transparent pixels " << x << " " << y;
-    Animated covering({{"filename", name.c_str()},
-                       {"decoder", "rawdec"},
-                       {"decoderParams", AnyDict("FOURCC", "BGR4", "width", 24, "height", 21)}});
-    const QvFrame& covered = covering.through(in);
-    EXPECT_EQ(covered.pixelPtr(23, 0)[0], 0);
-    EXPECT_EQ(covered.pixelPtr(24, 0)[0], background[0]);
 }
