@@ -1,16 +1,7 @@
 #include "builtin/decoders/sccdec.h"
 
-#include <gtest/gtest.h>
-
-#include <string>
-#include <vector>
-
-#include "core/engine/qvexception.h"
-#include "core/transcode/qvtranscodetask.h"
-#include "core/transcode/translink.h"
-#include "tests/support/fake_streams.h"
-#include "tests/support/log_capture.h"
-#include "tests/support/temp_folder.h"
+#include "core/engine/status.h"
+#include "tests/support/checks.h"
 
 namespace {
 
@@ -123,81 +114,6 @@ TEST_F(SccDecoder, OpensWhatHasCaptions) {
                                       {"filenames", Any(AnyVector(1))},
                                       {"filename", Any(3)}})
         EXPECT_EQ(decoder.setParam(name, value), QvStatus::invalidParam) << name;
-}
-
-// An encoder that puts captions into its stream: what its queue deals out, fillers left out.
-class CaptionEncoder : public FakeVideoEncoder {
-  public:
-    explicit CaptionEncoder(const QvFramerate& rate) : rate_(rate) {}
-
-    int writeFrame(QvFrame* frame) override {
-        if (written == 0) {
-            const MetaProcessParams mode(params.get("ccMode").asDict());
-            queue_.start(mode.doCc608(), mode.doCc708(), rate_, 0);
-        }
-        QvCcData captions, dealt;
-        if (frame->subpic() && captions.restore(*frame->subpic()) == 0) queue_.append(captions);
-        queue_.get(dealt, frameTime(written++, rate_));
-        dealt.removeFillers(frameTime(1 << 20));
-        for (const auto& pair : dealt.pairs())
-            text +=
-                Any::sprintf("%d:%d %02x%02x ", written - 1, pair.type(), pair.byte1, pair.byte2).asString();
-        return 0;
-    }
-
-    std::string text;
-    int written = 0;
-
-  private:
-    QvFramerate rate_;
-    QvCcProcessor queue_;
-};
-
-class CaptionPipe : public FakeEncodePipe {
-  public:
-    explicit CaptionPipe(const QvFramerate& rate) : FakeEncodePipe(rate), encoder(rate) {}
-    QvVideoEncoder* videoEncoder(int) const override { return const_cast<CaptionEncoder*>(&encoder); }
-    int writeFrame(QvFrame* frame, int) override { return encoder.writeFrame(frame); }
-    QvOStream* streamAt(int) const override { return const_cast<QvOStream*>(&stream_); }
-
-    CaptionEncoder encoder;
-
-  private:
-    QvOStream stream_{1};
-};
-
-TEST_F(SccDecoder, CaptionsOfALinkedFileReachTheEncoder) {
-    const auto both = file("a.scc", "00:00:00:04 9420 9421 9422\n00:00:00:29 942f\n") + "," +
-                      file("b.scc", "00:00:00:05 1520 1521\n00:00:00:29 152f\n");
-    const struct {
-        QvFramerate video;
-        const char* text;
-    } rows[] = {
-        // One pair of a field a frame, from the frame of the line's time on.
-        {QvFramerate::f29p(), "4:0 9420 5:0 9421 5:1 1520 6:0 9422 6:1 1521 29:0 942f 29:1 152f "},
-        // Two frames to one of the file, the fields take turns.
-        {QvFramerate::f59p(), "8:0 9420 10:0 9421 11:1 1520 12:0 9422 13:1 1521 58:0 942f 59:1 152f "},
-        // Frame 4 of the file begins behind the start of 3, frame 5 with 4.
-        {QvFramerate::f23p(), "4:0 9420 4:1 1520 5:0 9421 5:1 1521 5:0 9422 24:0 942f 24:1 152f "},
-    };
-    for (const auto& row : rows) {
-        ASSERT_EQ(open(both), 0);
-        FakeDecoder video(70, row.video);
-        CaptionPipe pipe(row.video);
-        QvTask task;
-        task.setEncoder(&pipe);
-        ASSERT_GE(task.link(&video, 1, 0, 0), 0);
-        MetaProcessParams mode;
-        mode.setCcMode(true, false, QvCcData::a53, false, false);
-        ASSERT_EQ(task.linkMeta(&decoder, qvSubpicStream, 0, 1, 0, mode), 0);
-        TransLink& link = *task.getLink(0);
-        ASSERT_EQ(link.open(nullptr), 0);
-        ASSERT_EQ(decoder.seek(link.inPoint(), qvSubpicStream, 0), 0);
-        while (!link.finished()) ASSERT_EQ(link.processFrame(0), 0);
-        link.close();
-        EXPECT_EQ(pipe.encoder.written, 70);
-        EXPECT_EQ(pipe.encoder.text, row.text) << row.video.desc(false, false).asString();
-    }
 }
 
 }  // namespace

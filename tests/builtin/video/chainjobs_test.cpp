@@ -7,9 +7,11 @@
 #include "core/filter/qvprocesspipe.h"
 #include "core/filter/qvprocessutil.h"
 #include "core/filter/userdatacallback.h"
+#include "core/transcode/qvtranscodetask.h"
 #include "core/transcode/translink.h"
 #include "tests/core/filter/chains.h"
 #include "tests/support/engine.h"
+#include "tests/support/pictures.h"
 #include "tests/support/temp_folder.h"
 
 namespace {
@@ -78,9 +80,11 @@ TEST_F(ChainJobs, CaptionsArriveOnceInOrderAndInTime) {
         const char* filter;
         int converters;
     } rows[] = {
-        {Rate::f59p(), Rate::f29p(), "", 1}, {Rate::f29p(), Rate::f59p(), "", 1}, {Rate::f59p(), i59, "", 1},
-        {Rate::f60p(), i59Bottom, "", 2},    {Rate::f23p(), i59, "", 1},          {Rate::f24p(), i59, "", 2},
+        {Rate::f59p(), Rate::f29p(), "", 1}, {Rate::f29p(), Rate::f59p(), "", 1},
+        {Rate::f59p(), i59, "", 1},          {Rate::f60p(), i59Bottom, "", 2},
+        {Rate::f23p(), i59, "", 1},          {Rate::f24p(), i59, "", 2},
         {Rate::f50p(), Rate::f24p(), "", 1}, {i59, Rate::f59p(), "bobber", 0},
+        {Rate::f23p(), Rate::f23p(), "", 0},
     };
     for (const auto& row : rows) {
         const double in = row.in.rate().ratio(), out = row.out.rate().ratio();
@@ -89,12 +93,17 @@ TEST_F(ChainJobs, CaptionsArriveOnceInOrderAndInTime) {
         openCaptions(captions);
         FakeDecoder decoder(static_cast<int>(4 * in), row.in);
         CaptionPipe pipe(row.out);
-        TransVLink link;
+        QvTask task;
+        task.setEncoder(&pipe);
+        ASSERT_EQ(task.link(&decoder, 1, 0, 0), 0);
+        MetaProcessParams mode;
+        mode.setCcMode(true, false, QvCcData::a53, false, false);
+        ASSERT_EQ(task.linkMeta(&captions, qvSubpicStream, 0, 1, 0, mode), 0);
+        auto& link = dynamic_cast<TransVLink&>(*task.getLink(0));
         AnyDict params;
         if (*row.filter) params.set("effects", AnyDict("customFilters", AnyVector(Any(stored(row.filter)))));
-        ASSERT_EQ(link.init(&decoder, 0, &pipe, 0), 0);
-        ASSERT_EQ(link.addMetaSource(&captions, 4, 0, {}), 0);
         ASSERT_EQ(link.open(&params), 0);
+        EXPECT_TRUE(MetaProcessParams(pipe.video.params.get("ccMode").asDict()).doCc608());
         EXPECT_EQ(link.filter("frconvert", row.converters), nullptr);
         EXPECT_TRUE(row.converters == 0 || link.filter("frconvert", row.converters - 1));
         while (!link.finished()) ASSERT_EQ(link.processFrame(0), 0);
@@ -117,7 +126,6 @@ TEST_F(ChainJobs, TheBobbersShareOfTheRateIsCounted) {
         const char* chain;
     } rows[] = {
         {Rate::f50p(), 1, 48, "bobber"},
-        {Rate::f50p(), 0, 48, "bobber"},
         // No field is dropped, though half the lines would do.
         {Rate::f50p(), 1, 24, "bobber scaler"},
         {Rate::f50p(), 0, 24, "scaler bobber"},
@@ -130,9 +138,7 @@ TEST_F(ChainJobs, TheBobbersShareOfTheRateIsCounted) {
         bobbed.filters.set("customFilters", AnyVector(Any(stored("bobber", AnyDict("_front", row.front)))));
         const auto pipe = pipeOf(bobbed, row.chain);
         int written = 0;
-        QvFrame frame;
-        frame.init(QvFourcc::I420, 64, 48);
-        frame.setBlack();
+        QvFrame frame = makePicture(QvFourcc::I420, 64, 48);
         frame.framerate = Rate::f50i();
         for (frame.frameNr = 0; frame.frameNr < 50; ++frame.frameNr) {
             EXPECT_EQ(pipe->write(frame), 0);

@@ -110,8 +110,9 @@ TEST_F(Logos, EveryFormatLooksAsMixedInRgb) {
         int x, y, left, top;
         double opacity;
     } const places[] = {
-        {11, 7, 11, 7, 0.6}, {-1, -2, 52 - 21 - 1, 40 - 21 - 2, 1}, {45, 30, 45, 30, 0.3},
-        {-41, -31, -10, -12, 1}, {60, 10, 60, 10, 1},
+        {11, 7, 11, 7, 0.6},   {-1, -2, 52 - 21 - 1, 40 - 21 - 2, 1},
+        {45, 30, 45, 30, 0.3}, {-41, -31, -10, -12, 1},
+        {60, 10, 60, 10, 1},
     };
     for (const auto& format : qvPixelFormats())
         for (const auto& place : places) {
@@ -163,7 +164,8 @@ TEST_F(Logos, FramesThatChangeAndPicturesThatDoNotFit) {
 TEST_F(Logos, FilesThatAreNoLogo) {
     const std::string bytes = TempFolder::read(png_);
     for (const std::string& name : {std::string(), folder_.file("none.png"), folder_.write("a.png", "PNG?"),
-                                    folder_.write("b.png", bytes.substr(0, 20)), folder_.path().string()}) {
+                                    folder_.write("b.png", bytes.substr(0, 20)), folder_.path().string(),
+                                    folder_.write("x.srt", "1\n00:00:00,000 --> 00:00:01,000\nHi\n")}) {
         QvLogo logo;
         logo.init();
         logo.setParam("filename", name.c_str());
@@ -187,20 +189,31 @@ TEST_F(Logos, MoviesRunFrameByFrame) {
         bytes += pictureBytes(frame);
     }
     const std::string name = folder_.write("disc.bgra", bytes);
+    const auto playing = [&](const Any& format, Params params) {
+        for (const auto& [key, value] : Params{{"filename", name.c_str()}, {"decoder", "rawdec"}})
+            params.emplace_back(key, value);
+        params.emplace_back("decoderParams", format);
+        return params;
+    };
+    const char* format = "FOURCC=BGRA;width=24;height=21";
     for (const int loop : {0, 1}) {
-        Animated logo({{"filename", name.c_str()},
-                       {"decoder", "rawdec"},
-                       {"decoderParams", "FOURCC=BGRA;width=24;height=21"},
-                       {"xpos", 4},
-                       {"ypos", 2},
-                       {"alpha", 0.8},
-                       {"loop", loop}});
+        Animated logo(playing(format, {{"xpos", 4}, {"ypos", 2}, {"alpha", 0.8}, {"loop", loop}}));
         for (int i = 0; i < 7; ++i) {
             const int step = loop ? i % 3 : std::min(i, 2);
             QvFrame in = converted(mixed(nullptr, 0, 0, 0, 52, 40), QvFourcc::I420);
             const QvFrame wanted = converted(mixed(&disc_, 4 + step, 2, 0.8, 52, 40), QvFourcc::I420);
             EXPECT_LE(difference(logo.through(in), wanted), 3.0) << loop << i;
         }
-        logo.close();
     }
+    // Twice as large a disc has nothing of the green of transparent pixels; without alpha a picture covers.
+    Animated twice(playing(format, {{"scale", 200}, {"xpos", -10}, {"ypos", -4}}));
+    QvFrame in = mixed(nullptr, 0, 0, 0, 100, 80);
+    const QvFrame& out = twice.through(in);
+    EXPECT_NEAR(out.pixelPtr(42 + 21, 34 + 21)[2], 255 * 10 / 21, 14);
+    EXPECT_EQ(out.pixelPtr(42 + 21, 34 + 21)[1], 30);
+    for (int i = 0; i < 100 * 80; ++i) EXPECT_LE(out.pixelPtr(i % 100, i / 100)[1], 92) << i;
+    Animated covering(playing(AnyDict("FOURCC", "BGR4", "width", 24, "height", 21), {}));
+    const QvFrame& covered = covering.through(in);
+    EXPECT_EQ(covered.pixelPtr(23, 0)[0], 0);
+    EXPECT_EQ(covered.pixelPtr(24, 0)[0], background[0]);
 }

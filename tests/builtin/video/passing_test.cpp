@@ -1,9 +1,6 @@
 // Filters that let frames pass: the raw dump and the user data callback.
-#include <fstream>
-
 #include "builtin/video/dumpraw.h"
 #include "builtin/video/userdata.h"
-#include "core/value/anycontainer.h"
 #include "tests/builtin/video/effect_frames.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/platform_scope.h"
@@ -23,33 +20,8 @@ Any pointer(void* p) { return Any(static_cast<const void*>(p)); }
 
 }  // namespace
 
-TEST(DumpRaw, WritesFramesAsTheyStand) {
+TEST(DumpRaw, AFullDiscIsToldOnceAndFramesPass) {
     const TempFolder folder;
-    const std::string name = folder.file("dump.raw");
-    Dump dump({{"filename", name.c_str()}});
-    std::string all;
-    for (const unsigned fourcc : {QvFourcc::I422, QvFourcc::BGR3}) {
-        QvFrame in = makePicture(fourcc, 7, 5, fourcc);
-        EXPECT_EQ(samplesOf(dump.through(in)), samplesOf(in));
-        EXPECT_EQ(dump.apply(in), 0);
-        all += pictureBytes(in) + pictureBytes(in);
-    }
-    EXPECT_EQ(dump.close(), 0);
-    EXPECT_EQ(TempFolder::read(name), all);
-}
-
-TEST(DumpRaw, FilesThatCanNotBeWritten) {
-    const TempFolder folder;
-    for (const std::string& name : {std::string("set me"), folder.file("no/where"), folder.path().string()}) {
-        DumpRaw dump;
-        dump.init();
-        dump.setParam("filename", name.c_str());
-        const LogCapture log;
-        EXPECT_EQ(dump.open(), -1);
-        EXPECT_TRUE(log.contains("Raw dumper, failed to open " + name + ", exiting."));
-        QvFrame frame = makePicture(QvFourcc::GRAY, 8, 8);
-        EXPECT_EQ(dump.write(frame), -18);
-    }
     const std::string name = folder.file("full.raw");
     FullDisc disc(100000);
     const PlatformScope scope(disc);
@@ -62,8 +34,8 @@ TEST(DumpRaw, FilesThatCanNotBeWritten) {
     EXPECT_EQ(dump.apply(frame), 0) << "it was told once";
     EXPECT_EQ(log.count("fail to write to " + name), 2) << "in both logs";
     EXPECT_EQ(dump.close(), -1);
-    EXPECT_EQ(dump.open(), 0);
-    EXPECT_EQ(dump.close(), 0);
+    EXPECT_EQ(dump.open() | dump.close(), 0);
+    EXPECT_EQ(TempFolder::read(name), "") << "made anew";
 }
 
 TEST(UserData, EachFrameIsShownOnceAndMayBeChanged) {

@@ -1,8 +1,11 @@
 #include "builtin/video/qvbobber.h"
 
 #include <algorithm>
+#include <climits>
+#include <cstring>
 #include <functional>
 
+#include "builtin/video/bobrows.h"
 #include "tests/builtin/kernels/targets.h"
 #include "tests/support/checks.h"
 #include "tests/support/pictures.h"
@@ -113,21 +116,49 @@ TEST(QvBobber, EveryFormatAndShape) {
         }
 }
 
-TEST(QvBobber, AllVectorUnitsGiveTheSameBytes) {
-    for (const QvPixelFormat& format : qvPixelFormats()) {
-        std::string first;
-        for (const int64_t target : machineTargets()) {
-            const OnTarget only(target);
-            Bob bob(77);
-            std::string all;
-            for (const int seed : {7, 8, 8}) {  // noise that moves, then noise that stands
-                QvFrame in = makePicture(format.fourcc, 83, 5, static_cast<unsigned>(seed));
-                in.framerate.setInterlaced(1);
-                ASSERT_EQ(bob.write(in), 0);
-                for (; bob.ready() > 0; bob.next()) all += pictureBytes(*bob.frame());
-            }
-            if (first.empty()) first = all;
-            EXPECT_TRUE(all == first) << qvFourccText(format.fourcc).data() << target;
-        }
-    }
+// Against the formula in plain numbers, sample by sample, on every vector unit and with odd lengths.
+TEST(BobRows, AllUnitsFollowTheFormula) {
+    using qvbob::Samples;
+    const struct {
+        Samples samples;
+        std::size_t lane;
+        std::vector<std::pair<int, int>> fields;  // shift and bits
+    } layouts[] = {
+        {Samples::bytes, 1, {{0, 8}}},
+        {Samples::words, 2, {{0, 16}}},
+        {Samples::tens, 4, {{0, 10}, {10, 10}, {20, 10}}},
+        {Samples::rgb555, 2, {{0, 5}, {5, 5}, {10, 5}}},
+        {Samples::rgb565, 2, {{0, 5}, {5, 6}, {11, 5}}},
+    };
+    QvFrame noise = makePicture(QvFourcc::GRAY, 303, 7);
+    const auto row = [&](int y) { return noise.pixelPtr(1, y); };
+    for (int i = 0; i < 300; i += 3)  // much stands nearly still
+        for (int r = 0; r < 3; ++r) row(3 + r)[i] = static_cast<unsigned char>(row(r)[i] ^ (i & 3));
+    for (const int64_t target : machineTargets())
+        for (const auto& layout : layouts)
+            for (const int w : {0, 77, 256})
+                for (const bool moved : {false, true}) {
+                    const OnTarget only(target);
+                    const std::size_t bytes = layout.lane == 1 ? 299 : 296;
+                    const qvbob::Triple now{row(0), row(1), row(2)}, before{row(3), row(4), row(5)};
+                    row(6)[bytes] = 0xA5;
+                    qvbob::fillRow(layout.samples, row(6), now, moved ? qvbob::Triple() : before, w, bytes);
+                    EXPECT_EQ(row(6)[bytes], 0xA5) << "beyond the row";
+                    for (std::size_t i = 0; i + 4 <= bytes; i += layout.lane)
+                        for (const auto& [shift, bits] : layout.fields) {
+                            const auto at = [&, shift = shift, bits = bits](int y) {
+                                unsigned lane = 0;
+                                std::memcpy(&lane, row(y) + i, layout.lane);
+                                return static_cast<int>(lane >> shift & ((1u << bits) - 1));
+                            };
+                            const int a = at(0), o = at(1), b = at(2);
+                            int motion = moved ? INT_MAX : 0;
+                            for (int r = 0; r < 3 && !moved; ++r)
+                                motion = std::max(motion, std::abs(at(r) - at(3 + r)));
+                            const int room = 32 * std::max(12 * (1 << bits) / 256 - motion, 0);
+                            const int woven = std::clamp(o, std::min(a, b) - room, std::max(a, b) + room);
+                            ASSERT_EQ(at(6), (((a + b + 1) >> 1) * (256 - w) + woven * w + 128) >> 8)
+                                << static_cast<int>(layout.samples) << " byte " << i << " w " << w;
+                        }
+                }
 }

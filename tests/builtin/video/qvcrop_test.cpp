@@ -38,6 +38,9 @@ TEST(QvCrop, BoxesFollowTheModes) {
         // Pixels twice as wide as high.
         {{{"inputFrameAspect", 32.0 / 9}, {"mode", 3}, {"cropAspect", 2.0}}, {0, 0, 1080, 1080}, 1080, 1080},
         {{{"mode", 5}}, {0, 0, 1920, 1080}, 1920, 1440},
+        {{{"padTop", 10}}, {0, 0, 1920, 1080}, 1920, 1080},
+        {{{"mode", 1}, {"padTop", 10}, {"mode", 2}}, {0, 0, 1920, 1080}, 1920, 1080},
+        {{{"mode", 1}, {"cropWidth", 640}, {"padTop", 4}, {"reset", 1}}, {0, 0, 1920, 1080}, 1920, 1080},
         {{{"mode", 4}, {"inputWidth", 1280}, {"inputHeight", 720}}, {160, 0, 1120, 720}, 960, 720},
         {{{"cropWidth", 640}, {"inputWidth", 320}}, {0, 0, 320, 360}, 320, 360},
     };
@@ -51,6 +54,32 @@ TEST(QvCrop, BoxesFollowTheModes) {
     }
 }
 
+TEST(QvCrop, LimitsAreToldAndHeld) {
+    struct {
+        Params params;
+        int limits[2][2];  // of the width, of the height
+    } const rows[] = {
+        {{{"mode", 1}}, {{32, 1920}, {32, 1080}}},
+        {{{"cropWidth", 640}, {"moveCropBox", QvPoint(960, 100)}}, {{32, 960}, {16, 540}}},
+        {{{"inputWidth", 1080}, {"inputHeight", 1920}}, {{16, 1080}, {32, 1920}}},
+        {{{"inputWidth", 20}, {"inputHeight", 20}}, {{20, 20}, {20, 20}}},
+    };
+    const char* const names[][3] = {{"minWidth", "maxWidth", "cropWidth"},
+                                    {"minHeight", "maxHeight", "cropHeight"}};
+    for (const auto& row : rows)
+        for (int side = 0; side < 2; ++side) {
+            Cropper crop(row.params);
+            const auto [least, most] = row.limits[side];
+            EXPECT_EQ(crop.number(names[side][0]), least) << &row - rows << side;
+            EXPECT_EQ(crop.number(names[side][1]), most) << &row - rows << side;
+            const Any before = crop.getParam("cropBox");
+            for (const int wrong : {most + 4, least - 4, 0}) {
+                EXPECT_EQ(crop.setParam(names[side][2], wrong), -1) << &row - rows << " " << wrong;
+                EXPECT_EQ(crop.getParam("cropBox"), before);
+            }
+        }
+}
+
 TEST(QvCrop, WhatItRefusesChangesNothing) {
     struct {
         int mode;
@@ -59,14 +88,15 @@ TEST(QvCrop, WhatItRefusesChangesNothing) {
         const char* text;
     } const rows[] = {
         {2, "inputWidth", INT_MAX, "Invalid state generic"},
+        {2, "inputHeight", 0, "Invalid state generic"},
         {2, "inputFrameAspect", 10.01, "invalid aspect"},
         {2, "cropAspect", 0.0, "invalid aspect"},
         {2, "mode", "free", "Invalid crop mode"},
+        {2, "mode", 6, "Invalid crop mode"},
         {4, "cropWidth", 640, "Can not change width in this mode"},
         {2, "moveCropBox", QvPoint(1, 0), "does not lie in the picture"},
         {1, "padTop", -1, "A pad is a number"},
         {1, "cropBox", QvRect(0, 0, 0, 5), "no rectangle"},
-        {2, "cropWidth", 1924, ""},
         {2, "cropHeight", INT_MIN, ""},
         {2, "state", AnyDict("mode", 9), "Invalid crop mode"},
     };
@@ -78,6 +108,26 @@ TEST(QvCrop, WhatItRefusesChangesNothing) {
         EXPECT_NE(std::string(crop.errorDesc()).find(row.text), std::string::npos) << crop.errorDesc();
         crop.store(after);
         EXPECT_EQ(Any(before), Any(after)) << row.name;
+    }
+}
+
+TEST(QvCrop, StatesGoFromOneToAnother) {
+    for (const int mode : {1, 2, 3, 4, 5}) {
+        const Cropper crop({{"inputFrameAspect", 1.5},
+                            {"cropAspect", 1.25},
+                            {"mode", mode},
+                            {"cropWidth", 640},
+                            {"moveCropBox", QvPoint(16, 0)},
+                            {"padLeft", 8}});
+        Cropper other({}), small({{"inputWidth", 1280}, {"inputHeight", 720}});
+        AnyDict stored;
+        crop.store(stored);
+        EXPECT_EQ(other.restore(stored), 0);
+        for (const char* name : {"state", "outputWidth", "outputHeight", "inputFrameAspect"})
+            EXPECT_EQ(other.getParam(name), crop.getParam(name)) << mode << name;
+        if (mode < 4) continue;
+        EXPECT_EQ(small.restore(stored), 0);
+        EXPECT_EQ(small.number("outputHeight"), mode == 4 ? 720 : 960) << "derived from its own input";
     }
 }
 

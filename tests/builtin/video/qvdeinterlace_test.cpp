@@ -43,6 +43,7 @@ TEST(QvDeinterlace, EachMethodTakesItsRows) {
     for (const auto& row : cases)
         for (const Any& method : row.method) {
             EXPECT_EQ(filter.setParam("deinterlace", method), 0);
+            EXPECT_EQ(filter.getParam("deinterlace"), Any(row.name));
             EXPECT_EQ(filter.write(in), -18) << "before open";
             ASSERT_EQ(filter.open(), 0);
             ASSERT_EQ(filter.write(in), 0);

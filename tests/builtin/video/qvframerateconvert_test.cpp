@@ -153,12 +153,34 @@ TEST(QvFramerateConvert, BrokenContractsAreAssertions) {
     const auto write = [&](int number, double rate = 50) { return converter.put(Input("A", number, rate)); };
     EXPECT_EQ(write(10), -18);
     converter.open();
+    EXPECT_THROW(converter.open(), QvAssertFailure);
     EXPECT_THROW(write(11, 25), QvAssertFailure);
     EXPECT_EQ(write(10), 0);
     EXPECT_THROW(write(11), QvAssertFailure) << "the frame before is unread";
     converter.next();
     EXPECT_EQ(write(11), 0);
     EXPECT_THROW(write(13), QvAssertFailure);
+    QvFrame empty;
+    EXPECT_EQ(converter.write(empty), -12);
+}
+
+TEST(QvFramerateConvert, StateAndPlaceInAChain) {
+    Converter converter(25, 12.5, 2, 1), other(24, 24);
+    EXPECT_EQ(converter.setParam("interlace", 3), -5);
+    AnyDict stored;
+    converter.store(stored);
+    EXPECT_EQ(other.restore(stored), 0);
+    for (const char* name : {"inFramerate", "outFramerate", "interlace", "pulldown"})
+        EXPECT_EQ(other.getParam(name), converter.getParam(name)) << name;
+    const struct {
+        double in, out;
+        int pulldown, safe;
+    } rows[] = {{25, 25, 0, 1}, {25, 50, 0, 0}, {24, 30, 1, 1}, {24, 25, 1, 0}};
+    for (const auto& row : rows) {
+        Converter opened(row.in, row.out, 0, row.pulldown);
+        opened.open();
+        EXPECT_EQ(opened.getParam("_safeToApplyAfter"), Any(row.safe)) << row.in << " " << row.out;
+    }
 }
 
 }  // namespace

@@ -1,16 +1,13 @@
 // The scaler as a filter, and the converter that applications use.
 #include "builtin/video/qvscalercc.h"
 
-#include <gtest/gtest.h>
-
 #include <cstring>
 #include <vector>
 
 #include "core/filter/qvcolorconvert.h"
 #include "core/media/qvframerate.h"
-#include "core/value/qvassert.h"
+#include "tests/support/checks.h"
 #include "tests/support/engine.h"
-#include "tests/support/log_capture.h"
 #include "tests/support/pictures.h"
 
 namespace {
@@ -40,6 +37,24 @@ QvFrame plain(unsigned fourcc, int width, int height, int value) {
 }
 
 }  // namespace
+
+TEST(QvScalerCC, ParametersAreKeptStoredAndRestored) {
+    QvScalerCC scaler, other;
+    scaler.init();
+    other.init();
+    const auto names = {"outWidth", "outHeight", "quality", "topBlankingLines", "inITU", "outITU"};
+    int value = 2;
+    for (const char* name : names) EXPECT_EQ(scaler.setParam(name, value++), 0) << name;
+    EXPECT_EQ(scaler.setParam("FOURCC", static_cast<int>(QvFourcc::BGR3)), 0);
+    EXPECT_NE(scaler.setParam("FOURCC", "YV123"), 0);
+    AnyDict stored;
+    scaler.store(stored);
+    EXPECT_EQ(other.restore(stored), 0);
+    EXPECT_EQ(other.getParam("FOURCC"), Any("BGR3"));
+    for (value = 2; const char* name : names) EXPECT_EQ(other.getParam(name), Any(value++)) << name;
+    stored.set("name", "flipper");
+    EXPECT_EQ(other.restore(stored), -1);
+}
 
 TEST(QvScalerCC, OutputsThatCanNotBeMadeFailToOpen) {
     for (const auto& [fourcc, w, h] :
@@ -86,6 +101,15 @@ TEST(QvScalerCC, MatricesFollowFrameParameterAndHeight) {
     Opened rgb("BGR3", 16, 16);
     QvFrame in = plain(QvFourcc::I420, 16, 16, 60);
     EXPECT_EQ(rgb.convert(in).YUVMatrix(), qvMatrixNotSet);
+}
+
+TEST(QvScalerCC, AlphaFirstGoesBothWays) {
+    QvFrame argb = makePicture(QvFourcc::ARGB, 12, 8, 3);
+    Opened same("ARGB", 12, 8), toBgr4("BGR4", 12, 8), back("ARGB", 12, 8);
+    EXPECT_EQ(pictureBytes(same.convert(argb)), pictureBytes(argb));
+    QvFrame& bgr4 = toBgr4.convert(argb);
+    for (int i = 0; i < 4; ++i) EXPECT_EQ(bgr4.plane()[i], argb.plane()[3 - i]);
+    EXPECT_EQ(pictureBytes(back.convert(bgr4)), pictureBytes(argb));
 }
 
 TEST(QvScalerCC, TheLastChromaLineOfTheBottomFieldIsRepeated) {

@@ -88,8 +88,11 @@ TEST_F(Subtitle, EncodingIsOfTheFile) {
 TEST_F(Subtitle, LooksAsItsParametersSay) {
     const std::string plain = at(30);
     std::vector<std::string> all{plain};
-    for (const Params& params : {Params{{"colorB", 0}}, {{"font_size", 20}}, {{"fontEffect", 1}},
-                                 {{"fontEffect", 3}}, {{"pixelAspect", 2.0}}}) {
+    for (const Params& params : {Params{{"colorB", 0}},
+                                 {{"font_size", 20}},
+                                 {{"fontEffect", 1}},
+                                 {{"fontEffect", 3}},
+                                 {{"pixelAspect", 2.0}}}) {
         all.push_back(at(30, params));
         for (std::size_t i = 0; i + 1 < all.size(); ++i)
             EXPECT_NE(all[i], all.back()) << params[0].first << i;
@@ -108,6 +111,8 @@ TEST_F(Subtitle, FilesWithoutSubtitles) {
         EXPECT_EQ(writer.open(), -9) << name;
         EXPECT_EQ(std::string(writer.errorDesc()), "Failed to read subtitle file " + name);
     }
+    file_.clear();
+    EXPECT_FALSE(shows(30)) << "without a file";
     const LogCapture log;
     file_ = folder_.write("empty.srt", "");
     EXPECT_FALSE(shows(30));

@@ -66,6 +66,8 @@ TEST(CVideoFade, EveryFormatFadesToItsBlackAndKeepsAlpha) {
         EXPECT_EQ(first == second, !alpha) << name;
         EXPECT_TRUE(samplesOf(fade.through(in)) == samplesOf(in)) << name << ": untouched behind the fade";
     }
+    QvFrame clear = makePicture(QvFourcc::BGRA, 4, 2);
+    EXPECT_EQ(Opened({{"fade_in", 1}}).through(clear).plane()[7], clear.plane()[7]);
     const Sample samples[] = {
         {QvFourcc::I420, 2, 0, 128}, {QvFourcc::YUYV, 0, 3, 128}, {QvFourcc::UYVY, 0, 1, 16},
         {QvFourcc::Y216, 0, 3, 128}, {QvFourcc::R32C, 0, 1, 16},  {QvFourcc::b64a, 0, 3, 0},

@@ -23,6 +23,48 @@ TEST_F(Transcoder, SoundFollowsThePictureAndTheOutputIsClosedBeforeTheEnd) {
     EXPECT_EQ(job.pipe.video.params.getInt32("timecodeOffset"), 55);
 }
 
+struct Resampler : FakeAudioFilter {
+    using FakeAudioFilter::FakeAudioFilter;
+    int open() override {
+        ratio = 1.0 * known.getInt32("outSamplerate") / known.getInt32("inSamplerate");
+        return FakeAudioFilter::open();
+    }
+};
+
+// To the sample, also where no whole number of them fits a frame and where the rate is converted.
+TEST_F(Transcoder, EachFrameBringsItsSamples) {
+    const struct {
+        QvRatio rate;
+        int frames, inRate, outRate;
+        long long samples;
+    } rows[] = {
+        {{30000, 1001}, 119, 48000, 48000, 190590},
+        {{30000, 1001}, 119, 44100, 44100, 175104},
+        {{60000, 1001}, 601, 32000, 44100, 442176},
+        {{15, 2}, 31, 11025, 11025, 45570},
+    };
+    plugin.add(new FakeModule<Resampler>(QvModuleType::audioFilter, "srconvert"));
+    for (const auto& row : rows) {
+        FakeDecoder decoder(row.frames, QvFramerate(row.rate));
+        decoder.audio(1LL << 30, row.inRate);
+        Events events;
+        NotedPipe pipe(events, QvFramerate(row.rate));
+        pipe.quiet = pipe.sound->quiet = true;
+        pipe.sound->params.set("samplerate", row.outRate);
+        QvTask task;
+        task.setEncoder(&pipe);
+        EXPECT_EQ(task.link(&decoder, 1, 0, 0) + task.link(&decoder, 2, 0, 0), 1);
+        NotedTranscoder t(events, &task);
+        t.onProcess = [&] {
+            const auto written = static_cast<long long>(pipe.video.numbers.size());
+            EXPECT_EQ(pipe.sound->total, written * row.outRate * row.rate.den / row.rate.num);
+            return 0;
+        };
+        EXPECT_EQ(t.transcode(true), 0) << t.errorDesc();
+        EXPECT_EQ(pipe.sound->total, row.samples) << row.inRate << " to " << row.outRate;
+    }
+}
+
 // How a run ends and who gets to know what.
 TEST_F(Transcoder, EveryEndHasItsOwnResult) {
     const struct {
