@@ -14,7 +14,8 @@ namespace srk {
 
 namespace {
 
-constexpr int mostBands = 16;
+constexpr int mostThreads = 16;
+constexpr int bandsPerThread = 2;  // a helper that wakes late leaves more to the others
 constexpr int leastBandLines = 8;
 constexpr uint32_t extended = qvFourcc("EXT1"), hdyc = qvFourcc("HDYC");
 
@@ -165,7 +166,8 @@ BandRange bandRange(const Plan& plan, int bands, int band) {
 }
 
 int bandCount(unsigned mode, const Plan& plan) {
-    int bands = mode & QvScale::oneThread ? 1 : std::min(qvThreadPool().width(), mostBands);
+    const int threads = std::min(qvThreadPool().width(), mostThreads);
+    int bands = mode & QvScale::oneThread ? 1 : bandsPerThread * threads;
     bands = std::clamp((plan.request.height + 4) / leastBandLines, 1, bands);
     return plan.fields == 2 ? std::max(2, (bands + 1) / 2 * 2) : bands;
 }

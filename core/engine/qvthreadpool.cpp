@@ -9,6 +9,12 @@
 
 #include "core/arch/platform.h"
 
+namespace {
+
+constexpr int turnsBeforeSleep = 200;
+
+}  // namespace
+
 // One parallelFor. It lives on the stack of its caller, who waits for every helper before it goes.
 struct QvThreadPool::Job {
     Job(Call function, void* data, int parts) : call(function), context(data), count(parts) {}
@@ -17,8 +23,8 @@ struct QvThreadPool::Job {
     void* const context;
     const int count;
     std::atomic<long long> next{0};  // every thread that finds no more adds one: wider than the count
-    int helpers = 0;                 // workers inside; guarded by the pool's lock
-    std::exception_ptr failed;       // likewise
+    std::atomic<int> helpers{0};     // workers inside; changed under the pool's lock
+    std::exception_ptr failed;       // guarded by the pool's lock
     std::condition_variable done;
     Job* below = nullptr;  // the list of open jobs, newest first
 
@@ -118,6 +124,9 @@ void QvThreadPool::run(int count, Call call, void* context) {
 
     state_->work(job);
 
+    // Helpers are at their last part, which ends sooner, as a rule, than a sleeping thread wakes.
+    for (int turn = 0; turn < turnsBeforeSleep && job.helpers.load(std::memory_order_relaxed) > 0; ++turn)
+        std::this_thread::yield();
     hold.lock();
     state_->close(job);
     job.done.wait(hold, [&job] { return job.helpers == 0; });
