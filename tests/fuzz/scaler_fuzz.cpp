@@ -39,38 +39,9 @@ unsigned fourccOf(Input& input) {
     const unsigned choice = input.take(1);
     if (choice >= 250) return input.take(4);
     if (choice >= 240) return qvFourcc("HDYC");
-    unsigned code = 0;
-    char name[5];
-    std::memcpy(name, srk::formats()[choice % srk::formatCount].name, 5);
-    if (name[2] == 'X') {
-        const unsigned bits = 9 + input.take(1) % 8;
-        name[2] = static_cast<char>('0' + bits / 10);
-        name[3] = static_cast<char>('0' + bits % 10);
-    }
-    std::memcpy(&code, name, 4);
-    return code;
-}
-
-// Memory for a picture whose lines stand as far apart as `stride` says; none for one that must be refused.
-size_t bytesOf(const Given& given) {
-    const int number = srk::formatNumber(given.fourcc);
-    if (number < 0 || given.width <= 0 || given.height <= 0) return 0;
-    srk::Picture picture;
-    picture.format = &srk::formats()[static_cast<size_t>(number & 0xffff)];
-    picture.width = given.width;
-    picture.height = given.height;
-    uint8_t byte = 0;
-    if (!srk::layOut(picture, &byte, given.stride)) return 0;
-    size_t bytes = 0;
-    for (int p = 0; p < picture.format->planes(); ++p) {
-        const int lines = picture.planeHeight(p);
-        const long long line = srk::lineBytes(*picture.format, picture.width, p);
-        if (lines == 0 || line == 0) continue;
-        const auto end =
-            picture.planes[p].data - &byte + std::llabs(picture.planes[p].stride) * (lines - 1) + line;
-        bytes = std::max(bytes, static_cast<size_t>(end));
-    }
-    return bytes;
+    std::string name = srk::formats()[choice % srk::formatCount].name;
+    if (name[2] == 'X') name = name.substr(0, 2) + std::to_string(100 + 9 + input.take(1) % 8).substr(1);
+    return codeOf(name);
 }
 
 Given givenOf(Input& input) {
@@ -84,32 +55,17 @@ Given givenOf(Input& input) {
 }
 
 // The planes of a picture as they lie in its memory, each walked upwards if its bit is set.
-QvScalePicture recordOf(Given& given, unsigned upwards) {
-    QvScalePicture record = {qvFourcc("EXT1"), given.fourcc, given.width, given.height, 0, 0, 0, {}};
-    if (given.memory.empty()) return record;
-    srk::Picture picture;
-    picture.format = &srk::formats()[static_cast<size_t>(srk::formatNumber(given.fourcc) & 0xffff)];
-    picture.width = given.width;
-    picture.height = given.height;
-    srk::layOut(picture, given.memory.data(), std::abs(given.stride));
-    int* const strides[3] = {&record.stride, &record.stride1, &record.stride2};
-    for (int p = 0; p < picture.format->planes(); ++p) {
-        auto plane = picture.planes[p];
-        if (upwards >> p & 1)
-            plane = {plane.data + plane.stride * std::max(picture.planeHeight(p) - 1, 0), -plane.stride};
-        record.planes[p] = plane.data;
-        *strides[p] = static_cast<int>(plane.stride);
-    }
-    // Planes of equal size may change places.
-    if (picture.format->planes() == 3 && !picture.format->has(srk::uBeforeV)) {
-        std::swap(record.planes[1], record.planes[2]);
-        std::swap(record.stride1, record.stride2);
-    }
-    return record;
+QvScalePicture record(Given& given, unsigned upwards) {
+    QvScalePicture none = {qvFourcc("EXT1"), given.fourcc, given.width, given.height, 0, 0, 0, {}};
+    if (given.memory.empty()) return none;
+    srk::Picture picture =
+        layoutOf(given.fourcc, given.width, given.height, given.memory.data(), std::abs(given.stride));
+    walkUpwards(picture, upwards);
+    return recordOf(given.fourcc, picture);
 }
 
 void asRecords(Given& source, Given& target, unsigned mode, unsigned flags, const int* rectangles) {
-    const QvScalePicture from = recordOf(source, flags >> 9), to = recordOf(target, flags >> 16);
+    const QvScalePicture from = record(source, flags >> 9), to = record(target, flags >> 16);
     SRScaler(mode, from.tag, &from, 0, 0, 0, to.tag, const_cast<QvScalePicture*>(&to), 0, 0, 0, 0, flags,
              rectangles);
 }
@@ -125,8 +81,8 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     int rectangles[8];
     for (int i = 0; i < 8; ++i)
         rectangles[i] = static_cast<int>(modes & 8 ? input.take(4) : input.take(i < 4 ? 2 : 1));
-    source.memory.resize(bytesOf(source));
-    target.memory.resize(bytesOf(target));
+    for (Given* given : {&source, &target})
+        given->memory.resize(bytesOf(given->fourcc, given->width, given->height, given->stride));
     for (size_t i = 0; i < source.memory.size(); ++i)
         source.memory[i] = input.left() ? input.rest()[i % input.left()] : static_cast<uint8_t>(i * 37);
     // The first line of a picture that goes upwards is the last one in memory.

@@ -5,14 +5,18 @@
 
 #include "core/media/qvbuffer.h"
 
+// Bytes that differ from place to place and from seed to seed.
+inline void fillBytes(unsigned char* to, size_t count, unsigned seed) {
+    unsigned value = seed * 2654435761u + 1;
+    for (size_t i = 0; i < count; ++i) {
+        value = value * 1664525u + 1013904223u;
+        to[i] = static_cast<unsigned char>(value >> 24);
+    }
+}
+
 // Every byte of every plane, padding included, depends on its place and on `seed`.
 inline void fillPicture(QvFrame& frame, unsigned seed) {
-    unsigned value = seed * 2654435761u + 1;
-    for (int plane = 0; plane < frame.planes(); ++plane)
-        for (int i = 0; i < frame.plane_bytes(plane); ++i) {
-            value = value * 1664525u + 1013904223u;
-            frame.plane(plane)[i] = static_cast<unsigned char>(value >> 24);
-        }
+    fillBytes(frame.plane(0), static_cast<size_t>(frame.total_bytes()), seed);
 }
 
 inline QvFrame makePicture(unsigned fourcc, int width, int height, unsigned seed = 1) {
@@ -30,11 +34,7 @@ inline std::string pictureBytes(const QvFrame& frame) {
 inline void fillSound(QvPcm& pcm, int samples, int channels, int bytesPerSample, int samplerate,
                       unsigned seed = 1) {
     pcm.init(samples, channels, bytesPerSample, samplerate);
-    unsigned value = seed * 2654435761u + 1;
-    for (int i = 0; i < samples * channels * bytesPerSample; ++i) {
-        value = value * 1664525u + 1013904223u;
-        pcm.ptr(0)[i] = static_cast<unsigned char>(value >> 24);
-    }
+    fillBytes(pcm.ptr(0), static_cast<size_t>(samples * channels * bytesPerSample), seed);
     pcm.setSamples(samples);
 }
 

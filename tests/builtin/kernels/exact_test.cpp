@@ -12,7 +12,7 @@
 #include "builtin/kernels/axis.h"
 #include "core/filter/srscaler.h"
 #include "core/media/fourcc.h"
-#include "tests/builtin/kernels/targets.h"
+#include "tests/support/vector_targets.h"
 
 namespace {
 
@@ -209,22 +209,4 @@ TEST(Exactness, WhatIsSymmetricStaysSoAtAnyRatio) {
             // The designed filter jumps by an eighth of a pixel between two of its phases.
             EXPECT_LE(worst, kind == QvScale::high ? 6000 : 2) << to.w << 'x' << to.h << " kind " << kind;
         }
-}
-
-TEST(Exactness, AShiftedPictureShifts) {
-    constexpr Size from = {66, 60}, to = {132, 120};
-    const Plane rings = zonePlate({80, 80}, 0.4, 255);
-    Plane here(from), there(from);
-    for (int y = 0; y < from.h; ++y)
-        for (int x = 0; x < from.w; ++x) {
-            here(x, y) = rings(x, y);
-            there(x, y) = rings(x + 4, y + 2);
-        }
-    for (const unsigned kind : kinds) {
-        const Plane a = through<uint8_t>(here, to, kind, nullptr),
-                    b = through<uint8_t>(there, to, kind, nullptr);
-        for (int y = 12; y < to.h - 20; ++y)
-            for (int x = 12; x < to.w - 24; ++x)
-                ASSERT_EQ(b(x, y), a(x + 8, y + 4)) << x << ',' << y << " kind " << kind;
-    }
 }

@@ -3,11 +3,12 @@
 
 #include <gtest/gtest.h>
 
+#include <array>
 #include <cmath>
 
 #include "builtin/kernels/rgbchroma.h"
 #include "builtin/kernels/yuvrgb.h"
-#include "tests/builtin/kernels/units.h"
+#include "tests/support/line_kernels.h"
 
 using namespace srk;
 
@@ -15,115 +16,41 @@ namespace {
 
 constexpr Matrix b601 = Matrix::bt601, b709 = Matrix::bt709;
 
-void chromaOf(const LineCase& l, const Byte (&weights)[4], bool filtered) {
-    const Byte* const lines[4] = {l.in[0], l.in[1], l.in[2], l.in[3]};
-    rgb4ToChroma(toYuv(b601, false), lines, weights, filtered, l.out[0], l.out[1], l.n);
+auto chroma(std::array<Byte, 4> weights, bool filtered) {
+    return [=](const LineCase& l) {
+        rgb4ToChroma(toYuv(b601, false), l.in, weights.data(), filtered, l.out[0], l.out[1], l.n);
+    };
 }
 
 const LineKernel kernels[] = {
-    {"split4",
-     {four},
-     {one, one, one, one},
-     [](const LineCase& l) { split4(l.in[0], l.out[0], l.out[1], l.out[2], l.out[3], l.n); }},
-    {"split4 of three",
-     {four},
-     {one, one, one},
-     [](const LineCase& l) { split4(l.in[0], l.out[0], l.out[1], l.out[2], nullptr, l.n); }},
-    {"join4",
-     {one, one, one, one},
-     {four},
-     [](const LineCase& l) { join4(l.out[0], l.in[0], l.in[1], l.in[2], l.in[3], l.n); }},
-    {"join4 opaque",
-     {one, one, one},
-     {four},
-     [](const LineCase& l) { join4(l.out[0], l.in[0], l.in[1], l.in[2], nullptr, l.n); }},
-    {"split3",
-     {three},
-     {one, one, one},
-     [](const LineCase& l) { split3(l.in[0], l.out[0], l.out[1], l.out[2], l.n); }},
-    {"join3",
-     {one, one, one},
-     {three},
-     [](const LineCase& l) { join3(l.out[0], l.in[0], l.in[1], l.in[2], l.n); }},
-    {"pack4to3", {four}, {three}, [](const LineCase& l) { pack4to3(l.out[0], l.in[0], l.n); }},
-    {"pack3to4", {three}, {four}, [](const LineCase& l) { pack3to4(l.out[0], l.in[0], l.n); }},
-    {"split565",
-     {twoBytes},
-     {one, one, one},
-     [](const LineCase& l) { split565(l.in[0], l.out[0], l.out[1], l.out[2], l.n, true); }},
-    {"split555",
-     {twoBytes},
-     {one, one, one},
-     [](const LineCase& l) { split565(l.in[0], l.out[0], l.out[1], l.out[2], l.n, false); }},
-    {"join565",
-     {one, one, one},
-     {twoBytes},
-     [](const LineCase& l) { join565(l.out[0], l.in[0], l.in[1], l.in[2], l.n, true); }},
-    {"join555",
-     {one, one, one},
-     {twoBytes},
-     [](const LineCase& l) { join565(l.out[0], l.in[0], l.in[1], l.in[2], l.n, false); }},
-    {"luma alone",
-     {one, one, one},
-     {one},
-     [](const LineCase& l) {
-         rgbToYuv(toYuv(b601, false), l.in[0], l.in[1], l.in[2], l.out[0], nullptr, nullptr, l.n);
-     }},
-    {"split YUYV",
-     {twoBytes},
-     {one, half, half},
-     [](const LineCase& l) { splitYuyv(l.in[0], l.out[0], l.out[1], l.out[2], l.n, true); }},
-    {"split UYVY",
-     {twoBytes},
-     {one, half, half},
-     [](const LineCase& l) { splitYuyv(l.in[0], l.out[0], l.out[1], l.out[2], l.n, false); }},
-    {"join YUYV",
-     {one, half, half},
-     {twoBytes},
-     [](const LineCase& l) { joinYuyv(l.out[0], l.in[0], l.in[1], l.in[2], l.n, true); }},
-    {"join UYVY",
-     {one, half, half},
-     {twoBytes},
-     [](const LineCase& l) { joinYuyv(l.out[0], l.in[0], l.in[1], l.in[2], l.n, false); }},
-    {"rgb4ToYuv",
-     {four},
-     {one, one, one},
-     [](const LineCase& l) { rgb4ToYuv(toYuv(b601, false), l.in[0], l.out[0], l.out[1], l.out[2], l.n); }},
-    {"rgb4ToYuv video",
-     {four},
-     {one, one, one},
-     [](const LineCase& l) { rgb4ToYuv(toYuv(b709, true), l.in[0], l.out[0], l.out[1], l.out[2], l.n); }},
-    {"rgbToYuv",
-     {one, one, one},
-     {one, one, one},
-     [](const LineCase& l) {
-         rgbToYuv(toYuv(b709, false), l.in[0], l.in[1], l.in[2], l.out[0], l.out[1], l.out[2], l.n);
-     },
-     true},
-    {"yuvToRgb",
-     {one, one, one},
-     {one, one, one},
-     [](const LineCase& l) {
-         yuvToRgb(toRgb(b601, false), l.in[0], l.in[1], l.in[2], l.out[0], l.out[1], l.out[2], l.n);
-     },
-     true},
-    {"yuvToRgb4",
-     {one, one, one},
-     {four},
-     [](const LineCase& l) {
-         yuvToRgb4(toRgb(b709, false), l.in[0], l.in[1], l.in[2], l.out[0], l.n, false);
-     }},
-    {"yuvToRgb3 video",
-     {one, one, one},
-     {three},
-     [](const LineCase& l) {
-         yuvToRgb3(toRgb(b709, true), l.in[0], l.in[1], l.in[2], l.out[0], l.n, false);
-     }},
+    {"split4", {four}, {one, one, one, one}, onLines(split4)},
+    {"split4 of three", {four}, {one, one, one}, onLines(split4)},
+    {"join4", {one, one, one, one}, {four}, onLines(join4)},
+    {"join4 opaque", {one, one, one}, {four}, onLines(join4)},
+    {"split3", {three}, {one, one, one}, onLines(split3)},
+    {"join3", {one, one, one}, {three}, onLines(join3)},
+    {"pack4to3", {four}, {three}, onLines(pack4to3)},
+    {"pack3to4", {three}, {four}, onLines(pack3to4)},
+    {"split565", {twoBytes}, {one, one, one}, onLines(split565, true)},
+    {"split555", {twoBytes}, {one, one, one}, onLines(split565, false)},
+    {"join565", {one, one, one}, {twoBytes}, onLines(join565, true)},
+    {"join555", {one, one, one}, {twoBytes}, onLines(join565, false)},
+    {"luma alone", {one, one, one}, {one}, onLines(rgbToYuv, toYuv(b601, false))},
+    {"split YUYV", {twoBytes}, {one, half, half}, onLines(splitYuyv, true)},
+    {"split UYVY", {twoBytes}, {one, half, half}, onLines(splitYuyv, false)},
+    {"join YUYV", {one, half, half}, {twoBytes}, onLines(joinYuyv, true)},
+    {"join UYVY", {one, half, half}, {twoBytes}, onLines(joinYuyv, false)},
+    {"rgb4ToYuv", {four}, {one, one, one}, onLines(rgb4ToYuv, toYuv(b601, false))},
+    {"rgb4ToYuv video", {four}, {one, one, one}, onLines(rgb4ToYuv, toYuv(b709, true))},
+    {"rgbToYuv", {one, one, one}, {one, one, one}, onLines(rgbToYuv, toYuv(b709, false)), true},
+    {"yuvToRgb", {one, one, one}, {one, one, one}, onLines(yuvToRgb, toRgb(b601, false)), true},
+    {"yuvToRgb4", {one, one, one}, {four}, onLines(yuvToRgb4, toRgb(b709, false), false)},
+    {"yuvToRgb3 video", {one, one, one}, {three}, onLines(yuvToRgb3, toRgb(b709, true), false)},
     {"yuvToRgb4, chroma repeated",
      {one, half, half},
      {four},
      [](const LineCase& l) {
-         if (l.n > 1) yuvToRgb4(toRgb(b601, false), l.in[0], l.in[1], l.in[2], l.out[0], l.n, true);
+         if (l.n > 1) onLines(yuvToRgb4, toRgb(b601, false), true)(l);
      }},
     {"yuvToOther",
      {one, one, one},
@@ -132,63 +59,25 @@ const LineKernel kernels[] = {
          for (int i = 0; i < 3; ++i) std::memmove(l.out[i], l.in[i], l.n);
          yuvToOther(toOther(b709), l.out[0], l.out[1], l.out[2], l.n);
      }},
-    {"toVideoLevels", {one}, {one}, [](const LineCase& l) { toVideoLevels(l.out[0], l.in[0], l.n); }, true},
-    {"toFullLevels", {one}, {one}, [](const LineCase& l) { toFullLevels(l.out[0], l.in[0], l.n); }, true},
-    {"widen",
-     {one},
-     {word},
-     [](const LineCase& l) { widen(reinterpret_cast<uint16_t*>(l.out[0]), l.in[0], l.n, false); }},
-    {"widen full",
-     {one},
-     {word},
-     [](const LineCase& l) { widen(reinterpret_cast<uint16_t*>(l.out[0]), l.in[0], l.n, true); }},
-    {"narrow", {word}, {one}, [](const LineCase& l) { narrow(l.out[0], l.words(0), l.n, false); }},
-    {"narrow full", {word}, {one}, [](const LineCase& l) { narrow(l.out[0], l.words(0), l.n, true); }},
-    {"twice", {one}, {twoBytes}, [](const LineCase& l) { twice(l.out[0], l.in[0], l.n); }},
-    {"evens", {twoBytes}, {one}, [](const LineCase& l) { evens(l.out[0], l.in[0], l.n); }},
-    {"doubleLine", {half}, {one}, [](const LineCase& l) { doubleLine(l.out[0], l.in[0], l.n); }},
-    {"rgb4ToLuma",
-     {four},
-     {one},
-     [](const LineCase& l) { rgb4ToLuma(toYuv(b709, false), l.in[0], l.out[0], l.n); }},
-    {"rgb4ToChroma",
-     {four, four, four, four},
-     {half, half},
-     [](const LineCase& l) {
-         chromaOf(l, {2, 6, 6, 2}, true);
-     }},
-    {"rgb4ToChroma of a line",
-     {four, four, four, four},
-     {half, half},
-     [](const LineCase& l) {
-         chromaOf(l, {chromaUnity, 0, 0, 0}, true);
-     }},
-    {"rgb4ToChroma of single pixels",
-     {four, four, four, four},
-     {half, half},
-     [](const LineCase& l) {
-         chromaOf(l, {1, 5, 7, 3}, false);
-     }},
-    {"rgb4ToChroma of a line's single pixels",
-     {four, four, four, four},
-     {half, half},
-     [](const LineCase& l) {
-         chromaOf(l, {chromaUnity, 0, 0, 0}, false);
-     }},
+    {"toVideoLevels", {one}, {one}, onLines(toVideoLevels), true},
+    {"toFullLevels", {one}, {one}, onLines(toFullLevels), true},
+    {"widen", {one}, {word}, onLines(widen, false)},
+    {"widen full", {one}, {word}, onLines(widen, true)},
+    {"narrow", {word}, {one}, onLines(narrow, false)},
+    {"narrow full", {word}, {one}, onLines(narrow, true)},
+    {"twice", {one}, {twoBytes}, onLines(twice)},
+    {"evens", {twoBytes}, {one}, onLines(evens)},
+    {"doubleLine", {half}, {one}, onLines(doubleLine)},
+    {"rgb4ToLuma", {four}, {one}, onLines(rgb4ToLuma, toYuv(b709, false))},
+    {"chroma of four lines", {four, four, four, four}, {half, half}, chroma({2, 6, 6, 2}, true)},
+    {"chroma of a line", {four, four, four, four}, {half, half}, chroma({chromaUnity}, true)},
+    {"chroma of single pixels", {four, four, four, four}, {half, half}, chroma({1, 5, 7, 3}, false)},
+    {"chroma of a line's pixels", {four, four, four, four}, {half, half}, chroma({chromaUnity}, false)},
 };
 
 }  // namespace
 
 TEST(Rows8, UnitsGiveTheBytesOfThePlainLoops) { compareUnits(kernels); }
-
-TEST(Rows8, UnitsOfTheMachineReallyRun) {
-    for (const auto target : machineTargets()) {
-        const OnTarget only(target);
-        EXPECT_STREQ(rows8Unit(), hwy::TargetName(target));
-        EXPECT_STREQ(rgbChromaUnit(), hwy::TargetName(target));
-        EXPECT_STREQ(yuvRgbUnit(), hwy::TargetName(target));
-    }
-}
 
 TEST(Rows8, MatricesStayNearTheExactFormula) {
     // Full levels to BT.601, with the weights of the standard.

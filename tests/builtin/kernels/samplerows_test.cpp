@@ -5,8 +5,14 @@
 
 #include <vector>
 
-#include "tests/builtin/kernels/guarded.h"
-#include "tests/builtin/kernels/targets.h"
+#include "builtin/kernels/deep.h"
+#include "builtin/kernels/rgbchroma.h"
+#include "builtin/kernels/rows16.h"
+#include "builtin/kernels/rows8.h"
+#include "builtin/kernels/scale8.h"
+#include "builtin/kernels/yuvrgb.h"
+#include "tests/support/guarded.h"
+#include "tests/support/vector_targets.h"
 
 using namespace srk;
 
@@ -94,8 +100,16 @@ TEST(SampleRows, AllUnitsFollowTheFormulas) {
     const Weights weights(200);
     for (const int64_t target : machineTargets()) {
         const OnTarget on(target);
-        EXPECT_STREQ(sampleRowsUnit(), hwy::TargetName(target));
         for (size_t n = 0; n < 140; n += n < 70 ? 1 : 13)
             for (const bool inPlace : {false, true}) check(n, inPlace, weights, table16);
+    }
+}
+
+TEST(Units, OfTheMachineReallyRun) {
+    for (const auto target : machineTargets()) {
+        const OnTarget only(target);
+        for (const auto unit :
+             {rows8Unit, rgbChromaUnit, yuvRgbUnit, rows16Unit, deepUnit, scale8Unit, sampleRowsUnit})
+            EXPECT_STREQ(unit(), hwy::TargetName(target));
     }
 }

@@ -4,13 +4,12 @@
 #include <gtest/gtest.h>
 
 #include <cmath>
-#include <memory>
 #include <numeric>
 #include <string>
 #include <vector>
 
-#include "tests/builtin/kernels/guarded.h"
-#include "tests/builtin/kernels/targets.h"
+#include "builtin/kernels/deep.h"
+#include "tests/support/line_kernels.h"
 
 using namespace srk;
 
@@ -33,7 +32,8 @@ const Geometry geometries[] = {
     {64, 129, centred(64, 129)},   {129, 43, centred(129, 43)}, {1920, 31, centred(1920, 31)},
     {65, 65, {0.25, 1}},           {65, 65, {64, -1}},          {50, 40, {-20, 3}},
     {300, 200, centred(300, 200)}, {90, 45, centred(90, 45)},   {33, 33, {0, 1}},
-    {279, 69, {1.5, 4}},           {276, 69, {0, 4}},
+    {279, 69, {1.5, 4}},           {276, 69, {0, 4}},           {40, 129, centred(40, 129)},
+    {129, 86, {0.25, 1.5}},        {400, 66, {2.5, 6.06}},
 };
 
 std::vector<int16_t> across(const Across& table, Guarded& line, int64_t target) {
@@ -98,65 +98,83 @@ TEST(Scale8, UnitsGiveTheBytesOfThePlainLoops) {
 }
 
 TEST(Scale8, LinesAreAddedUpAlike) {
-    for (const int taps : {1, 2, 4, 6, 8, 20})
-        for (int n = 1; n <= 70; ++n) {
-            std::vector<std::vector<int16_t>> lines;
-            std::vector<const int16_t*> starts;
-            std::vector<int16_t> weights(static_cast<size_t>(taps), 0);
-            for (int t = 0; t < taps; ++t) {
-                Guarded bytes(static_cast<size_t>(n), static_cast<unsigned>(t));
-                auto& words = lines.emplace_back(static_cast<size_t>(n + wordBlock));
-                for (int i = 0; i < n; ++i)
-                    words[static_cast<size_t>(i)] = static_cast<int16_t>(bytes.data()[i] * 170 - 16384);
-            }
-            for (const auto& line : lines) starts.push_back(line.data());
-            int left = unity;
-            for (int t = 0; t + 1 < taps; ++t)
-                left -= weights[static_cast<size_t>(t)] = static_cast<int16_t>(t % 3 ? 40 / taps : -15);
-            weights.back() = static_cast<int16_t>(left);
+    constexpr int longest = 70;
+    std::vector<int16_t> lines[20];
+    const int16_t* starts[20];
+    for (unsigned t = 0; t < 20; ++t) {
+        Byte bytes[longest + wordBlock];
+        fillBytes(bytes, sizeof bytes, t);
+        for (const Byte byte : bytes) lines[t].push_back(static_cast<int16_t>(byte * 170 - 16384));
+        starts[t] = lines[t].data();
+    }
+    for (const int taps : {1, 2, 4, 6, 8, 20}) {
+        int16_t weights[20], left = unity;
+        for (int t = 0; t + 1 < taps; ++t) {
+            weights[t] = static_cast<int16_t>(t % 3 ? 40 / taps : -15);
+            left = static_cast<int16_t>(left - weights[t]);
+        }
+        weights[taps - 1] = left;
+        for (int n = 1; n <= longest; ++n) {
             std::string expected;
             for (const auto target : machineTargets()) {
                 Guarded to(static_cast<size_t>(n), 9);
                 const OnTarget only(target);
-                scaleDown(starts.data(), weights.data(), taps, to.data(), n);
+                scaleDown(starts, weights, taps, to.data(), n);
                 const std::string bytes(reinterpret_cast<char*>(to.data()), to.size());
                 if (expected.empty()) expected = bytes;
                 ASSERT_EQ(bytes, expected) << taps << " taps, " << n << " on " << hwy::TargetName(target);
                 EXPECT_TRUE(to.frontIntact());
             }
         }
+    }
 }
 
-TEST(Scale8, LinesOfBytesAreAddedUpAlike) {
-    // Pairs of taps that lie half of the filter apart.
-    const std::vector<int8_t> sets[] = {
-        {50, 78}, {-10, 74, 74, -10}, {3, 80, -19, -19, 80, 3}, {-2, 79, 7, -20, -20, 7, 79, -2}};
-    for (const auto& weights : sets)
-        for (int n = 1; n <= 129; ++n) {
-            std::vector<std::unique_ptr<Guarded>> lines;
-            std::vector<const Byte*> starts;
-            const auto taps = static_cast<int>(weights.size());
-            for (int t = 0; t < taps; ++t) {
-                starts.push_back(lines
-                                     .emplace_back(std::make_unique<Guarded>(static_cast<size_t>(n),
-                                                                             static_cast<unsigned>(t)))
-                                     ->data());
+TEST(Deep, LinesAreScaledAcrossAlikeAndNearTheExactSum) {
+    for (const auto& g : geometries)
+        for (const auto filter : filters) {
+            const Axis axis = makeAxis(g.mapping, g.source, g.target, filter, true);
+            const DeepAcross across = makeDeepAcross(axis);
+            const auto source = static_cast<size_t>(g.source), target = static_cast<size_t>(g.target);
+            std::vector<uint16_t> line(source);
+            for (size_t i = 0; i < source; ++i) line[i] = static_cast<uint16_t>(i * i * 2654435761u >> 7);
+            std::vector<float> expected;
+            for (const auto unit : machineTargets()) {
+                std::vector<float> padded(source + beforeLine + behindLine), to(target + 1, 7);
+                const OnTarget only(unit);
+                deepAcross(axis, across, line.data(), padded.data(), to.data());
+                EXPECT_EQ(to[target], 7);
+                if (expected.empty()) expected = to;
+                ASSERT_EQ(to, expected) << g.source << " to " << g.target << " on " << hwy::TargetName(unit);
             }
-            std::string expected;
-            for (const auto target : machineTargets()) {
-                Guarded to(static_cast<size_t>(n), 9);
-                const OnTarget only(target);
-                scaleDownBytes(starts.data(), weights.data(), taps, to.data(), n);
-                const std::string bytes(reinterpret_cast<char*>(to.data()), to.size());
-                if (expected.empty()) expected = bytes;
-                ASSERT_EQ(bytes, expected) << taps << " taps, " << n << " on " << hwy::TargetName(target);
+            for (size_t i = 0; i < target && !axis.copies; ++i) {
+                double sum = 0;
+                for (int t = 0; t < axis.taps; ++t) {
+                    const int at = std::clamp(axis.start[i] + t, 0, g.source - 1);
+                    sum += static_cast<double>(
+                               axis.exact[i * static_cast<size_t>(axis.taps) + static_cast<size_t>(t)]) *
+                           line[static_cast<size_t>(at)];
+                }
+                ASSERT_NEAR(expected[i], sum, 0.05) << g.source << " to " << g.target << " at " << i;
             }
         }
 }
 
-TEST(Scale8, UnitsOfTheMachineReallyRun) {
-    for (const auto target : machineTargets()) {
-        const OnTarget only(target);
-        EXPECT_STREQ(scale8Unit(), hwy::TargetName(target));
-    }
+TEST(Scale8, LinesOfBytesAreAddedUpAlike) {
+    // Pairs of taps that lie half of the filter apart.
+    const auto addedUp = [](const std::vector<int8_t>& weights) {
+        return [=](const LineCase& l) {
+            const auto taps = static_cast<int>(weights.size());
+            scaleDownBytes(l.in, weights.data(), taps, l.out[0], static_cast<int>(l.n));
+        };
+    };
+    const LineKernel kernels[] = {
+        {"2 lines", {one, one}, {one}, addedUp({50, 78})},
+        {"4 lines", {one, one, one, one}, {one}, addedUp({-10, 74, 74, -10})},
+        {"6 lines", {one, one, one, one, one, one}, {one}, addedUp({3, 80, -19, -19, 80, 3})},
+        {"8 lines",
+         {one, one, one, one, one, one, one, one},
+         {one},
+         addedUp({-2, 79, 7, -20, -20, 7, 79, -2})},
+    };
+    compareUnits(kernels);
 }

@@ -9,19 +9,12 @@
 #include <string>
 #include <vector>
 
-#include "builtin/kernels/formats.h"
 #include "builtin/kernels/paths.h"
-#include "core/media/fourcc.h"
-#include "tests/builtin/kernels/guarded.h"
-#include "tests/builtin/kernels/targets.h"
+#include "tests/builtin/kernels/layouts.h"
+#include "tests/support/guarded.h"
+#include "tests/support/vector_targets.h"
 
 namespace {
-
-unsigned codeOf(const std::string& name) {
-    unsigned code = 0;
-    std::memcpy(&code, name.data(), std::min<size_t>(4, name.size()));
-    return code;
-}
 
 // All formats by names that a caller uses; one depth of each W family, and others beside.
 std::vector<std::string> formatNames() {
@@ -34,26 +27,11 @@ std::vector<std::string> formatNames() {
     return names;
 }
 
-// The bytes that a picture takes, no more.
-size_t bytesOf(const std::string& name, int w, int h) {
-    srk::Picture picture;
-    const int number = srk::formatNumber(codeOf(name));
-    picture.format = &srk::formats()[static_cast<size_t>(number & 0xffff)];
-    picture.width = w;
-    picture.height = h;
-    srk::Byte byte = 0;
-    srk::layOut(picture, &byte, 0);
-    size_t end = 0;
-    for (int p = 0; p < picture.format->planes(); ++p)
-        end = std::max(end, static_cast<size_t>(picture.planes[p].data - &byte) +
-                                static_cast<size_t>(picture.planes[p].stride) *
-                                    static_cast<size_t>(picture.planeHeight(p)));
-    return end;
-}
-
-int convert(const std::string& from, void* source, int w, int h, const std::string& to, void* target, int tw,
-            int th, unsigned flags = 0, unsigned mode = 0, const int* rectangles = nullptr) {
-    return SRScaler(mode, codeOf(from), source, 0, w, h, codeOf(to), target, 0, tw, th, 0, flags, rectangles);
+void convert(const std::string& from, const void* source, int w, int h, const std::string& to, void* target,
+             int tw, int th, unsigned flags = 0, unsigned mode = 0, const int* rectangles = nullptr) {
+    ASSERT_EQ(
+        SRScaler(mode, codeOf(from), source, 0, w, h, codeOf(to), target, 0, tw, th, 0, flags, rectangles), 1)
+        << from << ' ' << w << 'x' << h << " to " << to;
 }
 
 using Bytes = std::vector<unsigned char>;
@@ -84,10 +62,9 @@ TEST(Conversion, EveryPairKeepsAColour) {
                 for (size_t i = 0; i < rgb.size(); ++i) rgb[i] = colour[i % 3];
                 Guarded a(bytesOf(first, w, h)), b(bytesOf(second, w, h));
                 Bytes back(rgb.size());
-                ASSERT_EQ(convert("BGR3", rgb.data(), w, h, first, a.data(), w, h), 1);
-                ASSERT_EQ(convert(first, a.data(), w, h, second, b.data(), w, h), 1)
-                    << first << " to " << second;
-                ASSERT_EQ(convert(second, b.data(), w, h, "BGR3", back.data(), w, h), 1);
+                convert("BGR3", rgb.data(), w, h, first, a.data(), w, h);
+                convert(first, a.data(), w, h, second, b.data(), w, h);
+                convert(second, b.data(), w, h, "BGR3", back.data(), w, h);
                 const bool grey = first == "GRAY" || second == "GRAY" || first == "Y16" || second == "Y16";
                 const bool coarse = first[1] == '5' || second[1] == '5';
                 const double luma = 0.114 * colour[0] + 0.587 * colour[1] + 0.299 * colour[2];
@@ -127,10 +104,8 @@ TEST(Conversion, NothingOutsideOfThePicturesIsTouched) {
                      {QvScale::nearest, QvScale::standard | QvScale::interlaced, QvScale::high}) {
                     Guarded from(bytesOf("I420", w, h), 3), middle(bytesOf(name, w, h), 4),
                         to(bytesOf("YUYV", w + 3, h + 1), 5);
-                    ASSERT_EQ(convert("I420", from.data(), w, h, name, middle.data(), w, h, flags), 1)
-                        << name;
-                    ASSERT_EQ(convert(name, middle.data(), w, h, "YUYV", to.data(), w + 3, h + 1, flags), 1)
-                        << name;
+                    convert("I420", from.data(), w, h, name, middle.data(), w, h, flags);
+                    convert(name, middle.data(), w, h, "YUYV", to.data(), w + 3, h + 1, flags);
                     ASSERT_TRUE(from.frontIntact() && middle.frontIntact() && to.frontIntact())
                         << name << ' ' << w << 'x' << h;
                 }
@@ -140,27 +115,12 @@ namespace {
 
 // A picture in its own memory, whose lines follow each other downwards or upwards.
 struct Held {
-    srk::Picture layout;
     Bytes memory;
-    QvScalePicture record{};
+    srk::Picture layout;
 
-    Held(const std::string& name, int w, int h, bool upwards) : memory(bytesOf(name, w, h), 7) {
-        const int number = srk::formatNumber(codeOf(name));
-        layout.format = &srk::formats()[static_cast<size_t>(number & 0xffff)];
-        layout.width = w;
-        layout.height = h;
-        srk::layOut(layout, memory.data(), 0);
-        record = {qvFourcc("EXT1"), codeOf(name), w, h, 0, 0, 0, {}};
-        int* const strides[3] = {&record.stride, &record.stride1, &record.stride2};
-        for (int p = 0; p < layout.format->planes(); ++p) {
-            auto& plane = layout.planes[p];
-            if (upwards) plane = {plane.data + plane.stride * (layout.planeHeight(p) - 1), -plane.stride};
-            // The record has the format's order.
-            const int at =
-                p && !layout.format->has(srk::uBeforeV) && layout.format->planes() == 3 ? 3 - p : p;
-            *strides[at] = static_cast<int>(plane.stride);
-            record.planes[at] = plane.data;
-        }
+    Held(const std::string& name, int w, int h, bool upwards)
+        : memory(bytesOf(name, w, h), 7), layout(layoutOf(codeOf(name), w, h, memory.data())) {
+        walkUpwards(layout, upwards ? 7 : 0);
     }
     // The bytes of all lines from the top.
     template <class Each>
@@ -192,8 +152,10 @@ TEST(Conversion, EveryPairIsTheSameOnEveryUnitAndWithEitherSignOfStride) {
                             byte = static_cast<unsigned char>((value = value * 1664525u + 1013904223u) >> 24);
                         });
                         const OnTarget only(target);
-                        ASSERT_EQ(SRScaler(QvScale::oneThread, source.record.tag, &source.record, 0, 0, 0,
-                                           made.record.tag, &made.record, 0, 0, 0, 0, flags, nullptr),
+                        const auto a = recordOf(codeOf(from), source.layout);
+                        auto b = recordOf(codeOf(to), made.layout);
+                        ASSERT_EQ(SRScaler(QvScale::oneThread, a.tag, &a, 0, 0, 0, b.tag, &b, 0, 0, 0, 0,
+                                           flags, nullptr),
                                   1);
                         Bytes bytes;
                         made.eachByte([&](unsigned char byte) { bytes.push_back(byte); });
@@ -211,8 +173,8 @@ TEST(Conversion, TenBitsComeBackAsTheyWere) {
     for (size_t i = 0; i < words.size(); i += 2) words.data()[i] &= 0xC0;
     for (const char* name : {"v210", "P210", "W210", "Y216", "v216", "P216", "W216"}) {
         Guarded middle(bytesOf(name, w, h)), back(bytesOf("Y210", w, h));
-        ASSERT_EQ(convert("Y210", words.data(), w, h, name, middle.data(), w, h), 1);
-        ASSERT_EQ(convert(name, middle.data(), w, h, "Y210", back.data(), w, h), 1);
+        convert("Y210", words.data(), w, h, name, middle.data(), w, h);
+        convert(name, middle.data(), w, h, "Y210", back.data(), w, h);
         EXPECT_EQ(std::memcmp(words.data(), back.data(), words.size()), 0) << name;
     }
 }
@@ -221,23 +183,20 @@ TEST(Conversion, MatricesChangeOnlyBetweenDifferentOnes) {
     constexpr int w = 8, h = 4;
     Bytes blue(w * h * 3, 0), yuv(w * h * 4), other(w * h * 4), back(w * h * 3);
     for (size_t i = 0; i < blue.size(); i += 3) blue[i] = 255;
-    ASSERT_EQ(convert("BGR3", blue.data(), w, h, "VUY4", yuv.data(), w, h, QvScale::target601), 1);
+    convert("BGR3", blue.data(), w, h, "VUY4", yuv.data(), w, h, QvScale::target601);
     EXPECT_EQ(yuv[2], 41);
     EXPECT_EQ(yuv[1], 240);
     for (const char* name : {"I444", "I420", "YUYV", "v210", "W016"}) {
         Bytes middle(bytesOf(name, w, h));
-        ASSERT_EQ(convert("VUY4", yuv.data(), w, h, name, middle.data(), w, h,
-                          QvScale::source601 | QvScale::target709),
-                  1);
-        ASSERT_EQ(convert(name, middle.data(), w, h, "VUY4", other.data(), w, h,
-                          QvScale::source709 | QvScale::target709),
-                  1);
+        convert("VUY4", yuv.data(), w, h, name, middle.data(), w, h, QvScale::source601 | QvScale::target709);
+        convert(name, middle.data(), w, h, "VUY4", other.data(), w, h,
+                QvScale::source709 | QvScale::target709);
         EXPECT_NEAR(other[2], 32, 1) << name;
-        ASSERT_EQ(convert("VUY4", other.data(), w, h, "BGR3", back.data(), w, h, QvScale::source709), 1);
+        convert("VUY4", other.data(), w, h, "BGR3", back.data(), w, h, QvScale::source709);
         EXPECT_NEAR(back[0], 255, 3);
         EXPECT_NEAR(back[2], 0, 3);
     }
-    ASSERT_EQ(convert("BGR3", blue.data(), w, h, "HDYC", other.data(), w, h, QvScale::target601), 1);
+    convert("BGR3", blue.data(), w, h, "HDYC", other.data(), w, h, QvScale::target601);
     EXPECT_EQ(other[1], 32);
 }
 
@@ -252,7 +211,7 @@ TEST(Scaling, FlatStaysFlatAtAnySize) {
                 for (const char* name : {"I420", "BGR4", "W016", "YVU9"}) {
                     if (name[0] == 'W' && tw % 2) continue;  // lines with a byte to spare
                     Bytes from(bytesOf(name, w, h), 99), to(bytesOf(name, tw, th), 7);
-                    ASSERT_EQ(convert(name, from.data(), w, h, name, to.data(), tw, th, kind | field), 1);
+                    convert(name, from.data(), w, h, name, to.data(), tw, th, kind | field);
                     for (size_t i = 0; i < to.size(); ++i) {
                         if (std::string(name) == "BGR4" && i % 4 == 3) continue;
                         ASSERT_EQ(to[i], 99)
@@ -270,9 +229,7 @@ TEST(Scaling, RampsStayInPlaceAtAnyRatio) {
                 for (const unsigned field : {0u, QvScale::interlaced}) {
                     const Bytes from = ramp(w, h, 1.5, 0.5, 20);
                     Bytes to(static_cast<size_t>(tw * th));
-                    ASSERT_EQ(convert("GRAY", const_cast<unsigned char*>(from.data()), w, h, "GRAY",
-                                      to.data(), tw, th, kind | field),
-                              1);
+                    convert("GRAY", from.data(), w, h, "GRAY", to.data(), tw, th, kind | field);
                     for (int y = th / 4; y < th * 3 / 4; ++y)
                         for (int x = tw / 6; x < tw * 5 / 6; ++x) {
                             const double sx = (x + 0.5) * w / tw - 0.5, sy = (y + 0.5) * h / th - 0.5;
@@ -300,8 +257,8 @@ TEST(Scaling, ChromaFollowsLumaInEachFormatAndField) {
         for (const unsigned field : {0u, QvScale::interlaced})
             for (const unsigned kind : {QvScale::high, QvScale::standard}) {
                 Bytes middle(bytesOf(name, w, h)), back(yuv.size());
-                ASSERT_EQ(convert("VUY4", yuv.data(), w, h, name, middle.data(), w, h, kind | field), 1);
-                ASSERT_EQ(convert(name, middle.data(), w, h, "VUY4", back.data(), w, h, kind | field), 1);
+                convert("VUY4", yuv.data(), w, h, name, middle.data(), w, h, kind | field);
+                convert(name, middle.data(), w, h, "VUY4", back.data(), w, h, kind | field);
                 for (int y = 8; y < h - 8; ++y)
                     for (int x = 8; x < w - 8; ++x)
                         for (int p = 0; p < 3; ++p)
@@ -319,9 +276,8 @@ TEST(Scaling, BandsOnSeveralThreadsAreOnePicture) {
              {QvScale::standard, QvScale::high | QvScale::interlaced, QvScale::nearest}) {
             Guarded from(bytesOf(name, w, h), 6);
             Bytes one(bytesOf("YV12", tw, th), 1), many(bytesOf("YV12", tw, th), 2);
-            ASSERT_EQ(convert(name, from.data(), w, h, "YV12", one.data(), tw, th, flags, QvScale::oneThread),
-                      1);
-            ASSERT_EQ(convert(name, from.data(), w, h, "YV12", many.data(), tw, th, flags), 1);
+            convert(name, from.data(), w, h, "YV12", one.data(), tw, th, flags, QvScale::oneThread);
+            convert(name, from.data(), w, h, "YV12", many.data(), tw, th, flags);
             EXPECT_EQ(one, many) << name;
         }
 }
@@ -330,11 +286,10 @@ TEST(Scaling, RectanglesPlaceCropAndMirror) {
     constexpr int w = 16, h = 8;
     const Bytes from = ramp(w, h, 10, 1, 5);
     Bytes to(w * h, 200);
-    auto* source = const_cast<unsigned char*>(from.data());
+    auto* source = from.data();
     const int place[8] = {4 * 256, 2 * 256, 7 * 256, 3 * 256, 8, 4, 11, 5};
-    ASSERT_EQ(convert("GRAY", source, w, h, "GRAY", to.data(), w, h, 2,
-                      QvScale::cropSource | QvScale::placeTarget, place),
-              1);
+    convert("GRAY", source, w, h, "GRAY", to.data(), w, h, 2, QvScale::cropSource | QvScale::placeTarget,
+            place);
     for (int y = 0; y < h; ++y)
         for (int x = 0; x < w; ++x) {
             const bool inside = x >= 8 && x <= 11 && y >= 4 && y <= 5;
@@ -342,12 +297,11 @@ TEST(Scaling, RectanglesPlaceCropAndMirror) {
                       inside ? from[static_cast<size_t>((y - 2) * w + x - 4)] : 200);
         }
     const int mirror[8] = {(w - 1) * 256, 0, 0, (h - 1) * 256, 0, 0, 0, 0};
-    ASSERT_EQ(convert("GRAY", source, w, h, "GRAY", to.data(), w, h, 2, QvScale::cropSource, mirror), 1);
+    convert("GRAY", source, w, h, "GRAY", to.data(), w, h, 2, QvScale::cropSource, mirror);
     for (int x = 0; x < w; ++x) EXPECT_EQ(to[static_cast<size_t>(x)], from[static_cast<size_t>(w - 1 - x)]);
     // No scaling: what both have.
     Bytes small(12 * 4, 1);
-    ASSERT_EQ(convert("GRAY", source, w, h, "GRAY", small.data(), 12, 4, QvScale::clip | QvScale::standard),
-              1);
+    convert("GRAY", source, w, h, "GRAY", small.data(), 12, 4, QvScale::clip | QvScale::standard);
     for (int y = 0; y < 4; ++y) EXPECT_EQ(std::memcmp(small.data() + y * 12, from.data() + y * w, 12), 0);
 }
 
@@ -355,7 +309,7 @@ TEST(Scaling, PlanesAndLinesMayLieAnywhere) {
     constexpr int w = 20, h = 10;
     Guarded from(bytesOf("I420", w, h), 2);
     Bytes whole(bytesOf("BGR4", w, h)), upward(whole.size());
-    ASSERT_EQ(convert("I420", from.data(), w, h, "BGR4", whole.data(), w, h, 2), 1);
+    convert("I420", from.data(), w, h, "BGR4", whole.data(), w, h, 2);
     Guarded v(w * h / 4), u(w * h / 4), y(w * h);
     std::memcpy(y.data(), from.data(), y.size());
     std::memcpy(u.data(), from.data() + y.size(), u.size());
@@ -425,7 +379,7 @@ TEST(Scaling, LongestLines) {
     constexpr int longest = 65535;
     Guarded from(bytesOf("BGR3", longest, 2), 1), to(bytesOf("I420", 5, 4)),
         wide(bytesOf("UYVY", longest, 3));
-    EXPECT_EQ(convert("BGR3", from.data(), longest, 2, "I420", to.data(), 5, 4, 2), 1);
-    EXPECT_EQ(convert("I420", to.data(), 5, 4, "UYVY", wide.data(), longest, 3, 1), 1);
+    convert("BGR3", from.data(), longest, 2, "I420", to.data(), 5, 4, 2);
+    convert("I420", to.data(), 5, 4, "UYVY", wide.data(), longest, 3, 1);
     EXPECT_TRUE(to.frontIntact() && wide.frontIntact());
 }

@@ -1,74 +1,27 @@
+// On every vector unit of the machine the kernels give what their formulas say.
 #include "core/media/pixelkernels_p.h"
 
-#include <hwy/targets.h>
-
-#include <cstring>
-#include <random>
-#include <set>
-
-#include "tests/support/checks.h"
+#include "tests/support/line_kernels.h"
 
 namespace {
 
-using Bytes = std::vector<unsigned char>;
-
-constexpr std::size_t guard = 80;
-constexpr std::size_t lengths[] = {0, 1, 2, 15, 16, 17, 31, 63, 64, 65, 127, 200, 1021};
-
-Bytes noise(std::size_t count, unsigned seed) {
-    std::minstd_rand random(seed);
-    Bytes bytes(count);
-    for (auto& byte : bytes) {
-        const auto value = random() >> 8;
-        byte = static_cast<unsigned char>(value % 5 == 0 ? 255 : value % 5 == 1 ? 0 : value);
-    }
-    return bytes;
-}
-
-int wordAt(const Bytes& bytes, std::size_t at) { return bytes[at] | bytes[at + 1] << 8; }
-
-// Runs `check` on every vector unit of this machine and makes sure that it is the one that runs.
-template <class Check>
-void onAllUnits(Check check) {
-    std::set<std::string> seen;
-    for (const auto target : hwy::SupportedAndGeneratedTargets()) {
-        hwy::SetSupportedTargetsForTest(target);
-        hwy::GetChosenTarget().Update(hwy::SupportedTargets());
-        const std::string unit = qvpixels::vectorUnit();
-        EXPECT_EQ(unit, hwy::TargetName(target));
-        SCOPED_TRACE(unit);
-        seen.insert(unit);
-        check();
-    }
-    hwy::SetSupportedTargetsForTest(0);
-    hwy::GetChosenTarget().Update(hwy::SupportedTargets());
-    EXPECT_FALSE(seen.empty());
-}
-
-// One kernel over samples of `unit` bytes: reference(target, source, extra byte) is a sample's result.
-template <class Kernel, class Reference>
-void checkKernel(std::size_t unit, Kernel kernel, Reference reference) {
-    onAllUnits([&] {
-        for (const std::size_t count : lengths)
-            for (const std::size_t start : {0, 1, 3}) {
-                const std::size_t bytes = count * unit;
-                const Bytes before = noise(start + bytes + guard, 1 + static_cast<unsigned>(count));
-                const Bytes source = noise(start + bytes + guard, 2);
-                const Bytes extra = noise(start + bytes + guard, 3);
-                Bytes got = before;
-                kernel(got.data() + start, source.data() + start, extra.data() + start, count);
-                Bytes wanted = before;
-                for (std::size_t i = 0; i < count; ++i) {
-                    const std::size_t at = start + i * unit;
-                    const int value =
-                        unit == 1 ? reference(before[at], source[at], extra[start + i])
-                                  : reference(wordAt(before, at), wordAt(source, at), extra[start + i]);
-                    wanted[at] = static_cast<unsigned char>(value);
-                    if (unit == 2) wanted[at + 1] = static_cast<unsigned char>(value >> 8);
-                }
-                ASSERT_EQ(got, wanted) << count << " from " << start;
-            }
-    });
+// Works on the first line with the second one and, of one byte a sample, the third; reference(target, source,
+// extra byte) is a sample's result.
+template <class Sample, class Kernel, class Reference>
+auto checked(Kernel kernel, Reference reference) {
+    return [=](const LineCase& l) {
+        const auto sample = [](const unsigned char* line, size_t i) {
+            Sample value;
+            std::memcpy(&value, line + i * sizeof value, sizeof value);
+            return int{value};
+        };
+        std::vector<int> wanted, got;
+        for (size_t i = 0; i < l.n; ++i)
+            wanted.push_back(reference(sample(l.in[0], i), sample(l.in[1], i), l.in[2] ? l.in[2][i] : 0));
+        kernel(l.in[0], l.in[1], l.in[2], l.n);
+        for (size_t i = 0; i < l.n; ++i) got.push_back(sample(l.in[0], i));
+        EXPECT_EQ(got, wanted);
+    };
 }
 
 int masked(int target, int source, int mask) {
@@ -76,41 +29,53 @@ int masked(int target, int source, int mask) {
     return (target * (128 - w) + source * w) >> 7;
 }
 
+}  // namespace
+
 TEST(PixelKernels, MaskMixAndAverageInPlace) {
-    checkKernel(1, qvpixels::maskBytes, masked);
-    checkKernel(2, qvpixels::maskWords, masked);
+    std::vector<LineKernel> kernels = {
+        {"mask bytes", {one, one, one}, {}, checked<uint8_t>(qvpixels::maskBytes, masked)},
+        {"mask words", {twoBytes, twoBytes, one}, {}, checked<uint16_t>(qvpixels::maskWords, masked)},
+    };
     for (const int alpha : {0, 1, 127, 128, 254, 255}) {
-        const auto reference = [alpha](int target, int source, int) {
+        const auto mixed = [=](int target, int source, int) {
             return (target * (256 - alpha) + source * alpha) >> 8;
         };
-        const auto with = [alpha](auto kernel) {
-            return [=](auto* to, auto* from, auto*, std::size_t count) { kernel(to, from, alpha, count); };
+        const auto with = [=](auto kernel) {
+            return [=](auto* to, auto* from, auto*, size_t n) { kernel(to, from, alpha, n); };
         };
-        checkKernel(1, with(qvpixels::mixBytes), reference);
-        checkKernel(2, with(qvpixels::mixWords), reference);
+        kernels.push_back({"mix bytes", {one, one}, {}, checked<uint8_t>(with(qvpixels::mixBytes), mixed)});
+        kernels.push_back(
+            {"mix words", {twoBytes, twoBytes}, {}, checked<uint16_t>(with(qvpixels::mixWords), mixed)});
     }
     const auto inPlace = [](auto kernel) {
-        return [=](auto* to, auto* from, auto*, std::size_t count) { kernel(to, to, from, count); };
+        return [=](auto* to, auto* from, auto*, size_t n) { kernel(to, to, from, n); };
     };
-    const auto average = [](int target, int source, int) { return (target + source) / 2; };
-    checkKernel(1, inPlace(qvpixels::averageBytes), average);
-    checkKernel(2, inPlace(qvpixels::averageWords), average);
+    const auto mean = [](int target, int source, int) { return (target + source) / 2; };
+    kernels.push_back(
+        {"average bytes", {one, one}, {}, checked<uint8_t>(inPlace(qvpixels::averageBytes), mean)});
+    kernels.push_back({"average words",
+                       {twoBytes, twoBytes},
+                       {},
+                       checked<uint16_t>(inPlace(qvpixels::averageWords), mean)});
+    compareUnits(kernels, hwy::SupportedAndGeneratedTargets());
 }
 
 TEST(PixelKernels, SpreadMask) {
-    onAllUnits([] {
-        for (const std::size_t pixels : lengths)
-            for (int step = 1; step <= 2; ++step)
-                for (int copies = 1; copies <= 4; ++copies) {
-                    const auto each = static_cast<std::size_t>(copies);
-                    const Bytes mask = noise(static_cast<std::size_t>(step) * pixels, 4);
-                    Bytes got = noise(each * pixels + guard, 5), wanted = got;
-                    qvpixels::spreadMask(got.data(), mask.data(), step, copies, pixels);
-                    for (std::size_t i = 0; i < each * pixels; ++i)
-                        wanted[i] = mask[i / each * static_cast<std::size_t>(step)];
-                    ASSERT_EQ(got, wanted) << pixels << " " << step << " " << copies;
-                }
-    });
+    std::vector<LineKernel> kernels;
+    for (size_t step : {1u, 2u})
+        for (size_t copies = 1; copies <= 4; ++copies)
+            kernels.push_back({"spread", {{step}}, {{copies}}, [=](const LineCase& l) {
+                                   qvpixels::spreadMask(l.out[0], l.in[0], static_cast<int>(step),
+                                                        static_cast<int>(copies), l.n);
+                                   for (size_t i = 0; i < copies * l.n; ++i)
+                                       ASSERT_EQ(l.out[0][i], l.in[0][i / copies * step]) << copies;
+                               }});
+    compareUnits(kernels, hwy::SupportedAndGeneratedTargets());
 }
 
-}  // namespace
+TEST(PixelKernels, UnitsOfTheMachineReallyRun) {
+    for (const auto target : hwy::SupportedAndGeneratedTargets()) {
+        const OnTarget only(target);
+        EXPECT_STREQ(qvpixels::vectorUnit(), hwy::TargetName(target));
+    }
+}

@@ -4,74 +4,85 @@
 #pragma once
 
 #include <gtest/gtest.h>
-#include <sys/mman.h>
 
 #include <cstddef>
 #include <cstdint>
 #include <cstring>
+#include <functional>
 #include <span>
 #include <string>
+#include <tuple>
+#include <type_traits>
+#include <vector>
 
-#include "tests/builtin/kernels/targets.h"
+#include "tests/support/guarded.h"
+#include "tests/support/vector_targets.h"
 
 // Bytes of a line for n pixels: (n + more) / per * times; where its samples may begin.
 struct LineSize {
     size_t times = 0, per = 1, align = 1, more = 0;
     size_t of(size_t n) const { return (n + more) / per * times; }
 };
-constexpr LineSize none{}, one{1}, half{1, 2}, twoBytes{2}, three{3}, four{4};
+constexpr LineSize one{1}, half{1, 2}, twoBytes{2}, three{3}, four{4};
 constexpr LineSize word{2, 1, 2}, halfWord{2, 2, 2}, eight{8}, sixteen{16}, v210Groups{16, 6, 1, 5};
 
 struct LineCase {
-    unsigned char* in[4];
+    unsigned char* in[8];
     unsigned char* out[4];
     size_t n;
-    uint16_t* words(int i) const { return reinterpret_cast<uint16_t*>(in[i]); }
+    const uint16_t* words(int i) const { return reinterpret_cast<uint16_t*>(in[i]); }
     uint16_t* wordsOut(int i) const { return reinterpret_cast<uint16_t*>(out[i]); }
 };
 
 struct LineKernel {
     const char* name;
-    LineSize in[4], out[4];
-    void (*run)(const LineCase&);
-    bool inPlace = false;  // the first output may be the first input
+    LineSize in[8], out[4];
+    std::function<void(const LineCase&)> run;
+    bool inPlace = false;  // each output may be the input of its number
 };
+
+// Calls a kernel with the lines to read and to write in their order, null where the row has no more, and with
+// the number of pixels and what is given by their types.
+template <class... P, class... Given>
+auto onLines(void (*kernel)(P...), Given... given) {
+    return [=](const LineCase& l) {
+        auto in = l.in;
+        auto out = l.out;
+        const auto argument = [&]<class T>(std::type_identity<T>) -> std::decay_t<T> {
+            if constexpr (!std::is_pointer_v<T>)
+                return std::get<std::decay_t<T>>(std::tuple(l.n, given...));
+            else if constexpr (std::is_const_v<std::remove_pointer_t<T>>)
+                return reinterpret_cast<T>(*in++);
+            else
+                return reinterpret_cast<T>(*out++);
+        };
+        std::apply(kernel, std::tuple<std::decay_t<P>...>{argument(std::type_identity<P>())...});
+    };
+}
 
 // One line at a time, ending `gap` bytes before the page without access.
 class LineMemory {
   public:
-    LineMemory()
-        : map_(static_cast<unsigned char*>(
-              mmap(nullptr, 2 * room, PROT_READ | PROT_WRITE, MAP_PRIVATE | MAP_ANONYMOUS, -1, 0))) {
-        mprotect(map_ + room, room, PROT_NONE);
-    }
-    ~LineMemory() { munmap(map_, 2 * room); }
-    LineMemory(const LineMemory&) = delete;
-    LineMemory& operator=(const LineMemory&) = delete;
-
     unsigned char* place(size_t bytes, size_t gap, unsigned seed) {
-        line_ = map_ + room - gap - bytes;
+        line_ = end() - gap - bytes;
         bytes_ = bytes;
         std::memset(line_ - around, mark, around);
         std::memset(line_ + bytes, mark, gap);
-        unsigned value = seed * 2654435761u + 1;
-        for (size_t i = 0; i < bytes; ++i) {
-            value = value * 1664525u + 1013904223u;
-            line_[i] = static_cast<unsigned char>(value >> 24);
-        }
+        fillBytes(line_, bytes, seed);
         return line_;
     }
     std::string bytes() const { return {reinterpret_cast<const char*>(line_), bytes_}; }
-    bool intact() const {
-        for (const unsigned char* at = line_ - around; at < map_ + room; ++at)
+    bool intact() {
+        for (const unsigned char* at = line_ - around; at < end(); ++at)
             if ((at < line_ || at >= line_ + bytes_) && *at != mark) return false;
         return true;
     }
 
   private:
-    static constexpr size_t room = 4096, around = 64;
+    static constexpr size_t around = 64;
     static constexpr unsigned char mark = 0xA5;
-    unsigned char* map_;
+    unsigned char* end() { return room_.data() + room_.size(); }
+    Guarded room_{4096};
     unsigned char* line_ = nullptr;
     size_t bytes_ = 0;
 };
@@ -81,32 +92,36 @@ class UnitRunner {
     // What is in the lines behind a run.
     std::string run(const LineKernel& kernel, size_t n, size_t gap, bool inPlace, int64_t target) {
         LineCase lines{{}, {}, n};
-        for (unsigned i = 0; i < 4; ++i) {
-            const LineSize &in = kernel.in[i], &out = kernel.out[i];
-            lines.in[i] = in_[i].place(in.of(n), gap * in.align, i + static_cast<unsigned>(n));
-            lines.out[i] = out_[i].place(out.of(n), gap * out.align, 77 + i);
-            if (inPlace) lines.out[i] = lines.in[i];
-        }
+        for (unsigned i = 0; i < 8; ++i)
+            if (const LineSize& size = kernel.in[i]; size.times)
+                lines.in[i] = in_[i].place(size.of(n), gap * size.align, i + static_cast<unsigned>(n));
+        for (unsigned i = 0; i < 4; ++i)
+            if (const LineSize& size = kernel.out[i]; size.times)
+                lines.out[i] = inPlace ? lines.in[i] : out_[i].place(size.of(n), gap * size.align, 77 + i);
         {
             const OnTarget only(target);
             kernel.run(lines);
         }
         std::string result;
-        for (int i = 0; i < 4; ++i) {
-            result += in_[i].bytes() + out_[i].bytes();
-            if (!in_[i].intact() || !out_[i].intact()) result += "written beside the line";
-        }
+        const auto look = [&](LineMemory& line, const unsigned char* used) {
+            if (!used) return;
+            result += line.bytes();
+            if (!line.intact()) result += "written beside the line";
+        };
+        for (int i = 0; i < 8; ++i) look(in_[i], lines.in[i]);
+        for (int i = 0; i < 4; ++i)
+            if (!inPlace) look(out_[i], lines.out[i]);
         return result;
     }
 
   private:
-    LineMemory in_[4], out_[4];
+    LineMemory in_[8], out_[4];
 };
 
 // Widths 1 to 129, and every distance from the end of the memory up to a vector.
-inline void compareUnits(std::span<const LineKernel> kernels) {
+inline void compareUnits(std::span<const LineKernel> kernels,
+                         const std::vector<int64_t>& targets = machineTargets()) {
     UnitRunner runner;
-    const auto targets = machineTargets();
     for (const auto& kernel : kernels)
         for (size_t n = 1; n <= 129; ++n)
             for (size_t gap = 0; gap < 32; ++gap)

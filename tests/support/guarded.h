@@ -9,6 +9,8 @@
 #include <cstdint>
 #include <cstring>
 
+#include "tests/support/pictures.h"
+
 class Guarded {
   public:
     static constexpr std::size_t front = 64;
@@ -27,13 +29,7 @@ class Guarded {
     Guarded(const Guarded&) = delete;
     Guarded& operator=(const Guarded&) = delete;
 
-    void fill(unsigned seed) {
-        unsigned value = seed * 2654435761u + 1;
-        for (std::size_t i = 0; i < bytes_; ++i) {
-            value = value * 1664525u + 1013904223u;
-            data_[i] = static_cast<unsigned char>(value >> 24);
-        }
-    }
+    void fill(unsigned seed) { fillBytes(data_, bytes_, seed); }
     unsigned char* data() { return data_; }
     std::size_t size() const { return bytes_; }
     bool frontIntact() const {
