@@ -21,8 +21,7 @@ TEST(QvFrameFill, Black) {
     for (unsigned fourcc : allFormats())
         for (int width : {1, 2, 7, 33, 70})
             for (int padding : {0, 3, 4}) {
-                QvFrame frame;
-                makeNoise(frame, fourcc, width, 5, padding, ++seed);
+                QvFrame frame = noiseFrame(fourcc, width, 5, padding, ++seed);
                 frame.setBlack();
                 for (int p = 0; p < frame.planes(); ++p)
                     for (int i = 0; i < frame.plane_bytes(p); ++i)

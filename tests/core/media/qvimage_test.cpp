@@ -4,7 +4,7 @@
 #include <zlib.h>
 
 #include <algorithm>
-#include <array>
+#include <cstdio>
 #include <memory>
 
 #include "core/media/qvframe.h"
@@ -20,7 +20,7 @@ struct Image {
     int depth, type, interlace;
     bool transparent;  // entry 1 of the palette, or the key 1,1,1
     std::string row;
-    std::array<int, 4> pixels[3];  // what a reader of 8 bits gets: red, green, blue, alpha
+    const char* pixels;  // what a reader of 8 bits gets: red, green, blue, alpha of each
 
     void write(const std::string& name) const {
         std::unique_ptr<std::FILE, int (*)(std::FILE*)> file(std::fopen(name.c_str(), "wb"), std::fclose);
@@ -29,8 +29,8 @@ struct Image {
         png_init_io(png, file.get());
         png_set_IHDR(png, info, 3, 1, depth, type, interlace, PNG_COMPRESSION_TYPE_DEFAULT,
                      PNG_FILTER_TYPE_DEFAULT);
-        const png_color palette[] = {{0, 200, 0}, {3, 199, 1}, {6, 198, 2}, {9, 197, 3}};
-        if (type == PNG_COLOR_TYPE_PALETTE) png_set_PLTE(png, info, palette, 1 << depth);
+        const png_color colours[] = {{0, 200, 0}, {3, 199, 1}, {6, 198, 2}, {9, 197, 3}};
+        if (type == PNG_COLOR_TYPE_PALETTE) png_set_PLTE(png, info, colours, 1 << depth);
         const png_byte paletteAlpha[] = {255, 0};
         const png_color_16 key{1, 1, 1, 1, 1};
         if (transparent) png_set_tRNS(png, info, paletteAlpha, 2, &key);
@@ -42,43 +42,18 @@ struct Image {
     }
 };
 
+constexpr int flat = PNG_INTERLACE_NONE, woven = PNG_INTERLACE_ADAM7;
+constexpr int gray = PNG_COLOR_TYPE_GRAY, rgb = PNG_COLOR_TYPE_RGB, palette = PNG_COLOR_TYPE_PALETTE;
+constexpr int grayAlpha = PNG_COLOR_TYPE_GRAY_ALPHA, rgba = PNG_COLOR_TYPE_RGBA;
 const Image images[] = {
-    {16,
-     PNG_COLOR_TYPE_RGBA,
-     PNG_INTERLACE_ADAM7,
-     false,
+    {16, rgba, woven, false,
      "\1\x99\2\x99\3\x99\4\x99\x11\x99\x12\x99\x13\x99\xFF\x99\xF1\x99\xF2\x99\xF3\x99\x80\x99",
-     {{1, 2, 3, 4}, {17, 18, 19, 255}, {241, 242, 243, 128}}},
-    {8,
-     PNG_COLOR_TYPE_GRAY_ALPHA,
-     PNG_INTERLACE_NONE,
-     false,
-     "\x0A\xFF\x80\x40\xFF\x01",
-     {{10, 10, 10, 255}, {128, 128, 128, 64}, {255, 255, 255, 1}}},
-    {8,
-     PNG_COLOR_TYPE_RGB,
-     PNG_INTERLACE_NONE,
-     true,
-     "\1\1\1\1\1\2\7\x08\x09",
-     {{1, 1, 1, 0}, {1, 1, 2, 255}, {7, 8, 9, 255}}},
-    {2,
-     PNG_COLOR_TYPE_GRAY,
-     PNG_INTERLACE_NONE,
-     true,
-     "\x1C",
-     {{0, 0, 0, 255}, {85, 85, 85, 0}, {255, 255, 255, 255}}},
-    {4,
-     PNG_COLOR_TYPE_GRAY,
-     PNG_INTERLACE_ADAM7,
-     false,
-     "\x0F\x80",
-     {{0, 0, 0, 255}, {255, 255, 255, 255}, {136, 136, 136, 255}}},
-    {2,
-     PNG_COLOR_TYPE_PALETTE,
-     PNG_INTERLACE_NONE,
-     true,
-     "\x1C",
-     {{0, 200, 0, 255}, {3, 199, 1, 0}, {9, 197, 3, 255}}},
+     "01020304 111213ff f1f2f380"},
+    {8, grayAlpha, flat, false, "\x0A\xFF\x80\x40\xFF\x01", "0a0a0aff 80808040 ffffff01"},
+    {8, rgb, flat, true, "\1\1\1\1\1\2\7\x08\x09", "01010100 010102ff 070809ff"},
+    {2, gray, flat, true, "\x1C", "000000ff 55555500 ffffffff"},
+    {4, gray, woven, false, "\x0F\x80", "000000ff ffffffff 888888ff"},
+    {2, palette, flat, true, "\x1C", "00c800ff 03c70100 09c503ff"},
 };
 
 TEST(QvImageLoad, EveryKindOfPng) {
@@ -93,10 +68,13 @@ TEST(QvImageLoad, EveryKindOfPng) {
         ASSERT_TRUE(picture.four_cc() == BGR4 && picture.width() == 4 && picture.height() == 2);
         ASSERT_TRUE(alpha.inited() == hasAlpha && (!hasAlpha || alpha.four_cc() == GRAY));
         for (int i = 0; i < 8; ++i) {
-            const std::array<int, 4> wanted = i < 3 ? image.pixels[i] : std::array<int, 4>{};
+            const std::string wanted =
+                i < 3 ? std::string(image.pixels).substr(static_cast<std::size_t>(9 * i), 8) : "00000000";
             const unsigned char* const p = picture.pixelPtr(i % 4, i / 4);
-            const int opacity = hasAlpha ? *alpha.pixelPtr(i % 4, i / 4) : wanted[3];
-            EXPECT_EQ((std::array<int, 4>{p[2], p[1], p[0], opacity}), wanted) << i;
+            const unsigned opacity = hasAlpha ? *alpha.pixelPtr(i % 4, i / 4) : i < 3 ? 255 : 0;
+            char text[9];
+            std::snprintf(text, sizeof text, "%02x%02x%02x%02x", p[2], p[1], p[0], opacity);
+            EXPECT_EQ(text, wanted) << i;
             EXPECT_EQ(p[3], 0);
         }
     }

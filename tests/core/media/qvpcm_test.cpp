@@ -1,35 +1,28 @@
 #include "core/media/qvpcm.h"
 
 #include <climits>
-#include <functional>
 
 #include "core/engine/status.h"
 #include "tests/support/checks.h"
+#include "tests/support/pictures.h"
+#include "tests/support/wav_bytes.h"
 
 namespace {
 
-using Bytes = std::vector<unsigned char>;
-
-Bytes ramp(std::size_t count) {
-    Bytes bytes(count);
-    for (std::size_t i = 0; i < count; ++i) bytes[i] = static_cast<unsigned char>(i * 7 + 1);
-    return bytes;
-}
-
-Bytes contents(const QvPcm& pcm) {
-    return pcm.size() ? Bytes(pcm.ptr(0), pcm.ptr(0) + pcm.bytes()) : Bytes();
+int write(QvPcm& pcm, int samples, const std::string& bytes) {
+    return pcm.write(samples, reinterpret_cast<const unsigned char*>(bytes.data()));
 }
 
 TEST(QvPcm, GrowsByWhatIsMissing) {
     QvPcm pcm;
     ASSERT_EQ(pcm.init(3, 2, 2, 48000), 0);
-    const Bytes data = ramp(40);
-    ASSERT_EQ(pcm.write(2, data.data()), 0);
+    const std::string data = patternBytes(40);
+    ASSERT_EQ(write(pcm, 2, data), 0);
     EXPECT_EQ(pcm.size(), 3);
-    ASSERT_EQ(pcm.write(5, data.data() + 8), 0);
+    ASSERT_EQ(write(pcm, 5, data.substr(8)), 0);
     EXPECT_EQ(pcm.size(), 7);
     EXPECT_EQ(pcm.erase(3), 0);
-    EXPECT_EQ(contents(pcm), Bytes(data.begin() + 12, data.begin() + 28));
+    EXPECT_EQ(soundBytes(pcm), data.substr(12, 16));
     EXPECT_TRUE(pcm.grow(2) == 9 && pcm.samples() == 4);
     EXPECT_TRUE(pcm.erase(4) == 0 && pcm.erase(100) == 0);
     EXPECT_TRUE(pcm.samples() == 0 && pcm.sizeBytes() == 36);
@@ -38,28 +31,27 @@ TEST(QvPcm, GrowsByWhatIsMissing) {
 
 TEST(QvPcm, AppendsFromItself) {
     QvPcm pcm;
-    Bytes wanted = ramp(4);
+    std::string wanted = patternBytes(4);
     pcm.init(4, 1, 1, 8000);
-    pcm.write(4, wanted.data());
+    write(pcm, 4, wanted);
     for (int i = 0; i < 10; ++i) {
         ASSERT_EQ(pcm.write(pcm.samples() - 1, pcm.ptr(1)), 0);
-        const Bytes tail(wanted.begin() + 1, wanted.end());
-        wanted.insert(wanted.end(), tail.begin(), tail.end());
+        wanted += wanted.substr(1);
     }
-    EXPECT_EQ(contents(pcm), wanted);
+    EXPECT_EQ(soundBytes(pcm), wanted);
 }
 
 TEST(QvPcm, SilenceDependsOnTheWidth) {
     for (int width = 1; width <= 4; ++width) {
         QvPcm pcm;
         pcm.init(2, 2, width, 44100);
-        Bytes wanted = ramp(static_cast<std::size_t>(4 * width));
-        pcm.write(2, wanted.data());
+        std::string wanted = patternBytes(static_cast<std::size_t>(4 * width));
+        write(pcm, 2, wanted);
         for (int count : {0, -5, INT_MIN, 3}) EXPECT_EQ(pcm.addSilence(count), 0);
-        wanted.insert(wanted.end(), static_cast<std::size_t>(6 * width), width == 1 ? 128 : 0);
-        EXPECT_EQ(contents(pcm), wanted);
+        wanted.append(static_cast<std::size_t>(6 * width), width == 1 ? '\x80' : '\0');
+        EXPECT_EQ(soundBytes(pcm), wanted);
         pcm.clear();
-        EXPECT_EQ(contents(pcm), Bytes(wanted.size(), 0));
+        EXPECT_EQ(soundBytes(pcm), std::string(wanted.size(), 0));
     }
 }
 
@@ -87,11 +79,11 @@ TEST(QvPcm, InterleavesAnyWidth) {
 TEST(QvPcm, CopiesShareTheBufferUntilOneGrows) {
     QvPcm owner, view;
     owner.init(4, 1, 2, 8000);
-    owner.write(4, ramp(8).data());
+    write(owner, 4, patternBytes(8));
     view = owner;
     *view.ptr(1) = 77;
     EXPECT_TRUE(view.ptr(0) == owner.ptr(0) && *owner.ptr(1) == 77);
-    ASSERT_EQ(owner.write(2, ramp(4).data()), 0);
+    ASSERT_EQ(write(owner, 2, patternBytes(4)), 0);
     EXPECT_TRUE(view.ptr(0) != owner.ptr(0) && *owner.ptr(1) == 77 && view.size() == 4);
     owner.destroy();
     view = static_cast<const QvPcm&>(view);
