@@ -1,36 +1,11 @@
 // Any file loads or fails with a status; what was loaded can be asked for.
-#include <cstdint>
-#include <cstdio>
-#include <cstdlib>
-#include <string>
-
-#include <unistd.h>
-
 #include "core/engine/qviniparser.h"
-
-namespace {
-
-std::string scratchFile() {
-    char name[] = "/tmp/iniparser-fuzz-XXXXXX";
-    const int descriptor = mkstemp(name);
-    if (descriptor < 0) std::abort();
-    close(descriptor);
-    return name;
-}
-
-void require(bool holds) {
-    if (!holds) std::abort();
-}
-
-}  // namespace
+#include "tests/fuzz/fuzz.h"
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
-    static const std::string scratch = scratchFile();
-    std::FILE* const file = std::fopen(scratch.c_str(), "wb");
-    require(file && std::fwrite(data, 1, size, file) == size && std::fclose(file) == 0);
-
+    const MemoryFile file(data, size);
     QvIniParser ini;
-    const int status = ini.load(Any(scratch.c_str()), nullptr);
+    const int status = ini.load(Any(file.name()), nullptr);
     require(status == 0 || status == -15);
     require(status == 0 || ini.errors().size() > 0);
     for (int i = 0; i < ini.nrSections(); ++i) {

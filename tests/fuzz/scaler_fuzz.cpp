@@ -1,73 +1,51 @@
 // Calls the picture scaler with any formats, sizes, strides, flags and rectangles. Both pictures stand in
 // memory of just the size that an accepted call may use, so that the sanitizer sees one byte too many.
-#include <algorithm>
 #include <cstdint>
-#include <cstdlib>
-#include <cstring>
-#include <memory>
 #include <vector>
 
-#include "builtin/kernels/formats.h"
-#include "core/filter/srscaler.h"
-#include "core/media/fourcc.h"
+#include <fuzzer/FuzzedDataProvider.h>
+
+#include "tests/builtin/kernels/layouts.h"
 
 namespace {
 
-class Input {
-  public:
-    Input(const uint8_t* data, size_t size) : data_(data), left_(size) {}
-    unsigned take(int bytes) {
-        unsigned value = 0;
-        for (; bytes > 0 && left_ > 0; --bytes, --left_) value = value << 8 | *data_++;
-        return value;
-    }
-    const uint8_t* rest() const { return data_; }
-    size_t left() const { return left_; }
-
-  private:
-    const uint8_t* data_;
-    size_t left_;
-};
+using Input = FuzzedDataProvider;
 
 struct Given {
     unsigned fourcc;
     int width, height, stride;
     std::vector<uint8_t> memory;
+
+    // The first line of a picture that goes upwards is the last one in memory.
+    uint8_t* start() {
+        if (memory.empty()) return nullptr;
+        return memory.data() + (stride < 0 ? -static_cast<long long>(stride) * (height - 1) : 0);
+    }
+    // The planes as they lie in memory, each walked upwards if its bit is set.
+    QvScalePicture record(unsigned upwards) {
+        if (memory.empty()) return {qvFourcc("EXT1"), fourcc, width, height, 0, 0, 0, {}};
+        srk::Picture picture = layoutOf(fourcc, width, height, memory.data(), std::abs(stride));
+        walkUpwards(picture, upwards);
+        return recordOf(fourcc, picture);
+    }
 };
 
 unsigned fourccOf(Input& input) {
-    const unsigned choice = input.take(1);
-    if (choice >= 250) return input.take(4);
+    const auto choice = input.ConsumeIntegral<uint8_t>();
+    if (choice >= 250) return input.ConsumeIntegral<unsigned>();
     if (choice >= 240) return qvFourcc("HDYC");
     std::string name = srk::formats()[choice % srk::formatCount].name;
-    if (name[2] == 'X') name = name.substr(0, 2) + std::to_string(100 + 9 + input.take(1) % 8).substr(1);
+    if (name[2] == 'X')
+        name = name.substr(0, 2) + std::to_string(100 + input.ConsumeIntegralInRange(9, 16)).substr(1);
     return codeOf(name);
 }
 
 Given givenOf(Input& input) {
-    Given given;
-    given.fourcc = fourccOf(input);
-    given.width = static_cast<int>(input.take(1)) - 2;
-    given.height = static_cast<int>(input.take(1)) % 80 - 2;
-    const unsigned stride = input.take(2);
-    given.stride = stride % 3 ? 0 : static_cast<int16_t>(stride);
+    Given given = {
+        fourccOf(input), input.ConsumeIntegralInRange(-2, 253), input.ConsumeIntegralInRange(-2, 77), 0, {}};
+    if (input.ConsumeIntegralInRange(0, 2) == 0) given.stride = input.ConsumeIntegral<int16_t>();
+    given.memory.resize(bytesOf(given.fourcc, given.width, given.height, given.stride));
     return given;
-}
-
-// The planes of a picture as they lie in its memory, each walked upwards if its bit is set.
-QvScalePicture record(Given& given, unsigned upwards) {
-    QvScalePicture none = {qvFourcc("EXT1"), given.fourcc, given.width, given.height, 0, 0, 0, {}};
-    if (given.memory.empty()) return none;
-    srk::Picture picture =
-        layoutOf(given.fourcc, given.width, given.height, given.memory.data(), std::abs(given.stride));
-    walkUpwards(picture, upwards);
-    return recordOf(given.fourcc, picture);
-}
-
-void asRecords(Given& source, Given& target, unsigned mode, unsigned flags, const int* rectangles) {
-    const QvScalePicture from = record(source, flags >> 9), to = record(target, flags >> 16);
-    SRScaler(mode, from.tag, &from, 0, 0, 0, to.tag, const_cast<QvScalePicture*>(&to), 0, 0, 0, 0, flags,
-             rectangles);
 }
 
 }  // namespace
@@ -75,25 +53,23 @@ void asRecords(Given& source, Given& target, unsigned mode, unsigned flags, cons
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     Input input(data, size);
     Given source = givenOf(input), target = givenOf(input);
-    const unsigned flags = input.take(4);
-    const unsigned modes = input.take(1);
-    const unsigned mode = (modes & 3) | (modes & 4 ? QvScale::placeTarget : 0);
+    const auto flags = input.ConsumeIntegral<unsigned>();
+    const unsigned mode =
+        input.ConsumeIntegralInRange(0u, 3u) | (input.ConsumeBool() ? QvScale::placeTarget : 0);
+    const bool wild = input.ConsumeBool(), given = input.ConsumeBool(), records = input.ConsumeBool();
     int rectangles[8];
-    for (int i = 0; i < 8; ++i)
-        rectangles[i] = static_cast<int>(modes & 8 ? input.take(4) : input.take(i < 4 ? 2 : 1));
-    for (Given* given : {&source, &target})
-        given->memory.resize(bytesOf(given->fourcc, given->width, given->height, given->stride));
+    for (int& place : rectangles)
+        place = wild ? input.ConsumeIntegral<int>()
+                     : input.ConsumeIntegral<uint16_t>() >> (&place < rectangles + 4 ? 0 : 8);
+    const int* const areas = given ? rectangles : nullptr;
+    const auto rest = input.ConsumeRemainingBytes<uint8_t>();
     for (size_t i = 0; i < source.memory.size(); ++i)
-        source.memory[i] = input.left() ? input.rest()[i % input.left()] : static_cast<uint8_t>(i * 37);
-    // The first line of a picture that goes upwards is the last one in memory.
-    const auto start = [](Given& given) -> uint8_t* {
-        if (given.memory.empty()) return nullptr;
-        return given.memory.data() +
-               (given.stride < 0 ? -static_cast<long long>(given.stride) * (given.height - 1) : 0);
-    };
-    SRScaler(mode, source.fourcc, start(source), source.stride, source.width, source.height, target.fourcc,
-             start(target), target.stride, target.width, target.height, 0, flags,
-             modes & 16 ? rectangles : nullptr);
-    if (modes & 32) asRecords(source, target, mode, flags, modes & 16 ? rectangles : nullptr);
+        source.memory[i] = rest.empty() ? static_cast<uint8_t>(i * 37) : rest[i % rest.size()];
+    SRScaler(mode, source.fourcc, source.start(), source.stride, source.width, source.height, target.fourcc,
+             target.start(), target.stride, target.width, target.height, 0, flags, areas);
+    if (!records) return 0;
+    const QvScalePicture from = source.record(flags >> 9);
+    QvScalePicture to = target.record(flags >> 16);
+    SRScaler(mode, from.tag, &from, 0, 0, 0, to.tag, &to, 0, 0, 0, 0, flags, areas);
     return 0;
 }

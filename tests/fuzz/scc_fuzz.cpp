@@ -1,21 +1,12 @@
 // Any file opens or is refused with a status; every pair of what opened comes out of some frame, and a list
 // that is written whole reads back whole.
 #include <algorithm>
-#include <cstdint>
-#include <cstdlib>
-#include <fstream>
-#include <string>
-
-#include <unistd.h>
 
 #include "builtin/decoders/sccdec.h"
 #include "core/caption/cctext.h"
+#include "tests/fuzz/fuzz.h"
 
 namespace {
-
-void require(bool holds) {
-    if (!holds) std::abort();
-}
 
 // Only frames near a pair: a file may leave hours between two.
 void checkReading(SccDec& decoder, const QvCcData& data, const QvFramerate& rate) {
@@ -34,12 +25,13 @@ void checkReading(SccDec& decoder, const QvCcData& data, const QvFramerate& rate
     require(found == data.pairs().size());
 }
 
-void checkWriting(const QvCcData& data, const QvFramerate& rate, const std::string& name) {
-    require(data.writeScc(Any(name.c_str()), rate, {.complete = true}) == 0);
+void checkWriting(const QvCcData& data, const QvFramerate& rate) {
+    const MemoryFile file;
+    require(data.writeScc(Any(file.name()), rate, {.complete = true}) == 0);
     QvCcData back;
     QvFramerate given = rate;
     const bool df = rate.df();
-    require(back.readScc(Any(name.c_str()), 0, false, given, &df) == 0 && back.count() == data.count());
+    require(back.readScc(Any(file.name()), 0, false, given, &df) == 0 && back.count() == data.count());
     for (int i = 0; i < back.count(); ++i)
         require(back.at(i).byte1 == data.at(i).byte1 && back.at(i).byte2 == data.at(i).byte2);
 }
@@ -47,24 +39,21 @@ void checkWriting(const QvCcData& data, const QvFramerate& rate, const std::stri
 }  // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* bytes, std::size_t size) {
-    static const std::string name = "/tmp/scc-fuzz-" + std::to_string(getpid()) + ".scc";
-    std::ofstream(name, std::ios::binary)
-        .write(reinterpret_cast<const char*>(bytes), static_cast<std::streamsize>(size));
+    const MemoryFile file(bytes, size);
     for (const bool dropFrameLines : {false, true}) {
         SccDec decoder;
         decoder.init();
         decoder.setParam("dropFrameLines", dropFrameLines ? 1 : 0);
-        decoder.setParam("filenameField1", name.c_str());
+        decoder.setParam("filenameField1", file.name());
         QvCcData data;
         QvFramerate rate;
-        const int status = data.readScc(Any(name.c_str()), 0, true, rate, nullptr, dropFrameLines);
+        const int status = data.readScc(Any(file.name()), 0, true, rate, nullptr, dropFrameLines);
         require(status == 0 || status == -15);
         require(decoder.open() == (data.count() > 0 ? 0 : -9));
         if (data.count() == 0) continue;
         data.sort();
         checkReading(decoder, data, rate);
-        if (dropFrameLines) checkWriting(data, rate, name);
+        if (dropFrameLines) checkWriting(data, rate);
     }
-    std::remove(name.c_str());
     return 0;
 }

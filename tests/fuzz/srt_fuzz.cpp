@@ -1,23 +1,13 @@
 // Any bytes are read as subtitles or refused; what was read is found, and survives being saved and read.
-#include <cstdint>
 #include <cstdio>
-#include <cstdlib>
-#include <fstream>
 #include <string>
 
-#include <unistd.h>
-
 #include "core/caption/qvsubtitles.h"
+#include "tests/fuzz/fuzz.h"
 
 namespace {
 
-void require(bool holds) {
-    if (!holds) std::abort();
-}
-
 const QvFramerate rate(25.0);
-
-std::string nameFor(const char* ext) { return "/tmp/srt-fuzz-" + std::to_string(getpid()) + ext; }
 
 // Text of several lines of which one is empty ends at that line when it is read again.
 bool canBeReadAgain(const QvSubtitles& subtitles) {
@@ -33,16 +23,15 @@ bool canBeReadAgain(const QvSubtitles& subtitles) {
 }
 
 void checkSaved(QvSubtitles& subtitles) {
-    const std::string name = nameFor(".saved.srt");
-    require(subtitles.saveToFile(name.c_str(), QvSubtitles::SRT) == 0);
+    const MemoryFile file(".saved.srt");
+    require(subtitles.saveToFile(file.name(), QvSubtitles::SRT) == 0);
     QvSubtitles again;
-    require(again.parseFile(name.c_str(), rate) == 0);
+    require(again.parseFile(file.name(), rate) == 0);
     require(again.nrSubtitles() == subtitles.nrSubtitles());
     for (int i = 0; i < again.nrSubtitles(); ++i) {
         require(again.at(i)->text == subtitles.at(i)->text);
         require(again.at(i)->start.ms() == subtitles.at(i)->start.ms());
     }
-    std::remove(name.c_str());
 }
 
 }  // namespace
@@ -50,11 +39,9 @@ void checkSaved(QvSubtitles& subtitles) {
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
     static const bool quiet = std::freopen("/dev/null", "w", stdout) != nullptr;  // saving prints
     require(quiet);
-    const std::string name = nameFor(".srt");
-    std::ofstream(name, std::ios::binary)
-        .write(reinterpret_cast<const char*>(data), static_cast<std::streamsize>(size));
+    const MemoryFile file(data, size, ".srt");
     QvSubtitles subtitles;
-    const int status = subtitles.parseFile(name.c_str(), rate);
+    const int status = subtitles.parseFile(file.name(), rate);
     require(status == 0 || (status == -1 && subtitles.nrSubtitles() == 0));
     for (int i = 0; i < subtitles.nrSubtitles(); ++i) {
         const QvSubtitle& entry = *subtitles.at(i);
@@ -64,6 +51,5 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     }
     if (status == 0 && canBeReadAgain(subtitles)) checkSaved(subtitles);
     subtitles.changeFramerate(QvFramerate(29.97));
-    std::remove(name.c_str());
     return 0;
 }

@@ -1,24 +1,14 @@
 // Any bytes open as a subtitle source or are refused; every frame of what opened can be read and drawn.
 #include <algorithm>
-#include <cstdint>
-#include <cstdio>
-#include <cstdlib>
-#include <fstream>
-#include <string>
-
-#include <unistd.h>
 
 #include "builtin/decoders/subimporter.h"
 #include "core/arch/platform.h"
 #include "core/caption/qvsubtitlerender.h"
 #include "core/caption/qvtextrenderingoptions.h"
 #include "core/media/qvbuffer.h"
+#include "tests/fuzz/fuzz.h"
 
 namespace {
-
-void require(bool holds) {
-    if (!holds) std::abort();
-}
 
 QvTextRenderingOptions optionsFor(const QvFrame& frame) {
     QvTextRenderingOptions options;
@@ -45,12 +35,10 @@ void draw(const QvSubtitle& subtitle) {
 }  // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
-    static const std::string name = "/tmp/sub-fuzz-" + std::to_string(getpid()) + ".sub";
-    std::ofstream(name, std::ios::binary)
-        .write(reinterpret_cast<const char*>(data), static_cast<std::streamsize>(size));
+    const MemoryFile file(data, size, ".sub");
     SubImporter decoder;
     decoder.init();
-    decoder.setParam("filename", name.c_str());
+    decoder.setParam("filename", file.name());
     const int status = decoder.open();
     require(status == 0 || status == -9);
     if (status == 0) {
@@ -64,6 +52,5 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
         }
     }
     decoder.close();
-    std::remove(name.c_str());
     return 0;
 }

@@ -1,20 +1,11 @@
 // Any file opens or is refused with a status; what opened delivers exactly the samples that it promises.
 #include <algorithm>
-#include <cstdint>
-#include <cstdlib>
-#include <fstream>
-#include <string>
-
-#include <unistd.h>
 
 #include "builtin/decoders/wavdec.h"
 #include "core/media/qvbuffer.h"
+#include "tests/fuzz/fuzz.h"
 
 namespace {
-
-void require(bool holds) {
-    if (!holds) std::abort();
-}
 
 void checkReading(WavDec& decoder, std::size_t fileSize) {
     const long long samples = decoder.nrSamples(0);
@@ -36,16 +27,13 @@ void checkReading(WavDec& decoder, std::size_t fileSize) {
 }  // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
-    static const std::string name = "/tmp/wav-fuzz-" + std::to_string(getpid()) + ".wav";
-    std::ofstream(name, std::ios::binary)
-        .write(reinterpret_cast<const char*>(data), static_cast<std::streamsize>(size));
+    const MemoryFile file(data, size);
     WavDec decoder;
     decoder.init();
-    decoder.setParam("filename", name.c_str());
+    decoder.setParam("filename", file.name());
     const int status = decoder.open();
     require(status == 0 || status == -15);
     if (status == 0) checkReading(decoder, size);
     decoder.close();
-    std::remove(name.c_str());
     return 0;
 }
