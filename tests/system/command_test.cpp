@@ -132,10 +132,4 @@ TEST_F(Command, ProgressAsJson) {
     EXPECT_EQ(events.back()["state"], "done");
 }
 
-TEST_F(Command, TheLocaleChangesNoNumber) {
-    ProcessOptions german = here();
-    german.environment = {"LC_ALL=de_DE.UTF-8", "LANG=de_DE.UTF-8"};
-    EXPECT_EQ(tarsel({"info", "in.wav"}, german).out, tarsel({"info", "in.wav"}).out);
-}
-
 }  // namespace

@@ -42,21 +42,14 @@ class Installed : public Tool {
         EXPECT_EQ(o.status, 0) << o.err;
     }
     static std::vector<std::string> flags() {
-        if (std::string(QV_SANITIZE).empty()) return {};
-        return {"-fsanitize=" QV_SANITIZE};
+        return *QV_SANITIZE ? std::vector<std::string>{"-fsanitize=" QV_SANITIZE}
+                            : std::vector<std::string>();
     }
     std::string configure(const std::string& source, const std::string& build,
                           const std::string& more) const {
-        std::vector<std::string> words = {"cmake",
-                                          "-G",
-                                          "Ninja",
-                                          "-S",
-                                          source,
-                                          "-B",
-                                          folder.file(build),
-                                          "-DCMAKE_PREFIX_PATH=" + folder.file("tree"),
-                                          "-DCMAKE_CXX_COMPILER=" QV_COMPILER,
-                                          more};
+        std::vector<std::string> words{"cmake", "-GNinja", "-S", source, "-B", folder.file(build), more};
+        words.push_back("-DCMAKE_PREFIX_PATH=" + folder.file("tree"));
+        words.push_back("-DCMAKE_CXX_COMPILER=" QV_COMPILER);
         for (const auto& flag : flags()) words.push_back("-DCMAKE_CXX_FLAGS=" + flag);
         Outcome o = runProgram(words, here());
         if (o.status == 0) o = runProgram({"cmake", "--build", folder.file(build)}, here());

@@ -27,41 +27,29 @@ class Rates : public Tool {
 TEST_F(Rates, FramesAndSamplesAreCountedAndRight) {
     const struct {
         int frames;
-        const char *in, *out;
+        const char *raw, *out;
         std::vector<std::string> more;
+        unsigned inSamples;
         long long written, samples;
         const char* first;
     } rows[] = {
-        {100, "25", "50", {}, 200, 176400, "0 0 1 1 2 2"},
-        {100, "50", "25", {}, 50, 88200, "0 2 4 6 8 10"},
-        {100, "50", "25", {"--from", "10f", "--to", "50f"}, 20, 35280, "10 12 14 16 18 20"},
-        {99, "50", "25i", {}, 50, 87318, "0/1 2/3 4/5 6/7 8/9 10/11"},
-        {96, "24", "30i", {}, 120, 176400, "0 0/1 1/2 2 3 4 4/5"},
-        {96, "24000/1001", "30000/1001i", {}, 120, 176576, "0 0/1 1/2 2 3 4 4/5"},
-        {100, "25", "30000/1001", {}, 119, 175104, "0 0 1 2 3 4"},
-        {100, "25i", "50", {"--filter", "bobber"}, 200, 176400, "0 0 1 1 2 2"},
+        {100, "rate=25", "50", {}, 176400, 200, 176400, "0 0 1 1 2 2"},
+        {100, "rate=50", "25", {}, 88200, 50, 88200, "0 2 4 6 8 10"},
+        {100, "rate=50", "25", {"--from", "10f", "--to", "50f"}, 88200, 20, 35280, "10 12 14 16 18 20"},
+        {99, "rate=50", "25i", {}, 87318, 50, 87318, "0/1 2/3 4/5 6/7 8/9 10/11"},
+        {96, "rate=24", "30i", {}, 176400, 120, 176400, "0 0/1 1/2 2 3 4 4/5"},
+        {96, "rate=24000/1001", "30000/1001i", {}, 176576, 120, 176576, "0 0/1 1/2 2 3 4 4/5"},
+        {100, "rate=25", "30000/1001", {}, 176400, 119, 175104, "0 0 1 2 3 4"},
+        {100, "rate=25,interlaced=1", "50", {"--filter", "bobber"}, 176400, 200, 176400, "0 0 1 1 2 2"},
     };
     for (const auto& row : rows) {
         makeCounted("in.yuv", row.frames);
-        const bool isInterlaced = std::string(row.in).back() == 'i';
-        const std::string rate(row.in, std::strlen(row.in) - (isInterlaced ? 1 : 0));
-        double fps = std::stod(rate);
-        if (rate.find('/') != std::string::npos) fps /= 1001;
-        const std::string sound =
-            contents(makeWav("in.wav", static_cast<unsigned>(row.frames / fps * 44100)));
-        std::vector<std::string> arguments = {
-            "transcode",
-            "in.yuv",
-            "in.wav",
-            "--raw",
-            "size=64x48,pixel=I420,rate=" + rate + (isInterlaced ? ",interlaced=1" : ""),
-            "--rate",
-            row.out,
-            "-o",
-            "o.raw",
-            "-y"};
+        const std::string sound = contents(makeWav("in.wav", row.inSamples));
+        const std::string format = std::string("size=64x48,pixel=I420,") + row.raw;
+        std::vector<std::string> arguments{"transcode", "in.yuv", "in.wav", "--raw", format, "-o", "o.raw"};
+        arguments.insert(arguments.end(), {"-y", "--rate", row.out});
         arguments.insert(arguments.end(), row.more.begin(), row.more.end());
-        const std::string what = std::string(row.in) + " to " + row.out;
+        const std::string what = std::string(row.raw) + " to " + row.out;
         works(arguments);
         EXPECT_EQ(size("o.raw"), row.written * static_cast<long long>(kFrame)) << what;
         const auto seen =

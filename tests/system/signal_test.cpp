@@ -11,15 +11,33 @@ class Signal : public Tool {
     static constexpr const char* kEndless = "testgen:size=64x64,rate=25,duration=20000,audio=0";
     // The same with frames that no pipe holds: a reader that takes none of it holds the job up for sure.
     static constexpr const char* kLarge = "testgen:size=1280x720,rate=25,duration=20000,audio=0";
+    // Returns the reading end of a pipe that is the output.
+    int openPipe() const {
+        mkfifo(folder.file("pipe.raw").c_str(), 0600);
+        return open(folder.file("pipe.raw").c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
+    }
+    static bool hasData(int reader) {
+        pollfd data{reader, POLLIN, 0};
+        return poll(&data, 1, Process::kPatience) == 1;
+    }
+    static std::vector<std::string> intoPipe() {
+        return words({"transcode", kLarge, "-o", "pipe.raw", "--progress", "json"});
+    }
     static std::vector<std::string> endless() {
         return words({"transcode", kEndless, "-o", "out.raw", "--progress", "json"});
     }
 };
 
-TEST_F(Signal, StopsAndCleansUp) {
-    const struct { int signal, status; } cases[] = {{SIGINT, 130}, {SIGTERM, 143}, {SIGHUP, 129}};
+TEST_F(Signal, StopsAndLeavesWhatWasThere) {
+    const struct {
+        int signal, status;
+        std::set<std::string> before;
+    } cases[] = {{SIGINT, 130, {}}, {SIGTERM, 143, {}}, {SIGHUP, 129, {"out.raw"}}};
     for (const auto& c : cases) {
-        Process run(endless(), here());
+        for (const auto& name : c.before) folder.write(name, "precious");
+        auto job = endless();
+        job.push_back("-y");
+        Process run(job, here());
         ASSERT_TRUE(run.waitFor("\"event\":\"progress\""));
         run.signal(c.signal);
         const Outcome o = run.finish();
@@ -27,30 +45,17 @@ TEST_F(Signal, StopsAndCleansUp) {
         EXPECT_THAT(o.err, testing::HasSubstr("\"event\":\"end\""));
         EXPECT_THAT(o.err, testing::HasSubstr("\"state\":\"stopped\""));
         EXPECT_THAT(o.err, testing::HasSubstr("tarsel: stopped; nothing was left behind\n"));
-        EXPECT_EQ(listing(), std::set<std::string>());
+        EXPECT_EQ(listing(), c.before);
     }
-}
-
-TEST_F(Signal, AnExistingOutputStaysAsItWas) {
-    folder.write("out.raw", "precious");
-    auto job = endless();
-    job.push_back("-y");
-    Process run(job, here());
-    ASSERT_TRUE(run.waitFor("\"event\":\"progress\""));
-    run.signal(SIGINT);
-    EXPECT_EQ(run.finish().status, 130);
     EXPECT_EQ(contents("out.raw"), "precious");
-    EXPECT_EQ(listing(), std::set<std::string>{"out.raw"});
 }
 
 TEST_F(Signal, TheSecondEndsAtOnce) {
-    mkfifo(folder.file("pipe.raw").c_str(), 0600);
-    const int reader = open(folder.file("pipe.raw").c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
-    Process run(words({"transcode", kLarge, "-o", "pipe.raw", "--progress", "json"}), here());
+    const int reader = openPipe();
+    Process run(intoPipe(), here());
     ASSERT_TRUE(run.waitFor("\"event\":\"start\""));
     char byte;
-    pollfd data{reader, POLLIN, 0};
-    ASSERT_EQ(poll(&data, 1, Process::kPatience), 1);
+    ASSERT_TRUE(hasData(reader));
     ASSERT_EQ(read(reader, &byte, 1), 1);
     run.signal(SIGINT);
     ASSERT_TRUE(run.waitFor("tarsel: stopping"));
@@ -61,11 +66,9 @@ TEST_F(Signal, TheSecondEndsAtOnce) {
 }
 
 TEST_F(Signal, AReaderThatGoesIsAnError) {
-    mkfifo(folder.file("pipe.raw").c_str(), 0600);
-    const int reader = open(folder.file("pipe.raw").c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
-    Process run(words({"transcode", kLarge, "-o", "pipe.raw", "--progress", "json"}), here());
-    pollfd data{reader, POLLIN, 0};
-    ASSERT_EQ(poll(&data, 1, Process::kPatience), 1);
+    const int reader = openPipe();
+    Process run(intoPipe(), here());
+    ASSERT_TRUE(hasData(reader));
     close(reader);
     const Outcome o = run.finish();
     EXPECT_EQ(o.status, 4);

@@ -10,7 +10,7 @@ TEST_F(Sound, EverySampleArrives) {
         unsigned bits, channels, rate, samples;
     } cases[] = {
         {8, 1, 8000, 1},      {16, 2, 48000, 100003}, {16, 6, 96000, 9999},
-        {24, 8, 48000, 3001}, {24, 3, 22050, 12345},
+        {24, 8, 48000, 3001}, {24, 3, 22050, 12345},  {16, 2, 44100, 0},
     };
     for (const auto& c : cases) {
         SCOPED_TRACE(std::to_string(c.bits) + " bits, " + std::to_string(c.channels) + " channels");
@@ -19,7 +19,7 @@ TEST_F(Sound, EverySampleArrives) {
         ASSERT_EQ(o.status, 0) << o.err;
         const std::string in = contents("take.wav"), out = contents("out.wav");
         EXPECT_TRUE(wavPart(in, "data") == wavPart(out, "data"));
-        EXPECT_EQ(wavPart(in, "fmt ").substr(2, 14).substr(0, 6), wavPart(out, "fmt ").substr(2, 6));
+        EXPECT_EQ(wavPart(in, "fmt ").substr(2, 6), wavPart(out, "fmt ").substr(2, 6));
     }
 }
 
@@ -47,14 +47,6 @@ TEST_F(Sound, PointsAreSamples) {
         EXPECT_TRUE(in.substr(c.first * 4, (c.end - c.first) * 4) == wavPart(contents("part.wav"), "data"))
             << c.from;
     }
-}
-
-TEST_F(Sound, AFileWithoutSamplesStaysOne) {
-    makeWav("silent.wav", 0);
-    works({"transcode", "silent.wav", "-o", "out.wav"});
-    EXPECT_EQ(wavPart(contents("out.wav"), "fmt ").substr(2, 6),
-              wavPart(contents("silent.wav"), "fmt ").substr(2, 6));
-    EXPECT_EQ(wavPart(contents("out.wav"), "data"), "");
 }
 
 // An unknown length, as a recorder leaves it, is taken for what it is; any other one that lies is not.

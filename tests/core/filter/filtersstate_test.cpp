@@ -30,7 +30,7 @@ TEST(FiltersState, FixedFiltersComeFirstInTheOrderOfTheirNames) {
     EXPECT_EQ(tags(state.getActive()), (Tags{4, 1, 5}));
     EXPECT_EQ(state.names(false), AnyVector("cropper", "flipper", "logo", "logo", "timecode"));
     EXPECT_EQ(state.names(true), AnyVector("cropper", "logo", "timecode"));
-    EXPECT_EQ(state.count() * 10 + state.activeCount(), 53);
+    EXPECT_EQ(state.activeCount(), 3);
 
     state.setFilter("logo", filter("logo", 1, 9));
     state.setFilter("flipper", filter("flipper", 1, 8));

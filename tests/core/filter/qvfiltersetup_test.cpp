@@ -11,8 +11,7 @@ namespace {
 class FilterSetup : public testing::Test {
   protected:
     FilterSetup() {
-        for (const char* name :
-             {"logo", "timecode", "brightness", "userdata", "flipper", "deinterlace", "cropper"})
+        for (const char* name : {"logo", "timecode", "brightness", "flipper", "deinterlace", "cropper"})
             plugin_.video(name);
         plugin_.audio("avol");
     }
@@ -55,9 +54,6 @@ TEST_F(FilterSetup, ParametersOfTheEffects) {
               AnyDict("font_filename", wide("f.ttf"), "mode", 0));
     EXPECT_EQ(known(setup_.addBrightness(0.1, 1.2, 0.9, false)),
               AnyDict("brightness", 0.1, "contrast", 1.2, "gamma", 0.9));
-    const AnyDict& callback = known(setup_.addUserDataCallback(&setup_, &plugin_, false));
-    EXPECT_EQ(callback.get("context").asGeneric(), &plugin_);
-    EXPECT_EQ(callback.get("callback").asGeneric(), &setup_);
     QvAFilterSetup audio;
     auto* volume = audio.addVolume(-3.5, true, false);
     EXPECT_EQ(volume->getParam("volume"), Any(-3.5));
