@@ -136,18 +136,6 @@ TEST(QvScalerCC, BlankLinesStayBlackAndTheRestIsThePicture) {
     }
 }
 
-TEST(QvScalerCC, EveryFrameFormatMeetsEveryOther) {
-    for (const auto& from : qvPixelFormats())
-        for (const auto& to : qvPixelFormats()) {
-            QvFrame in = plain(QvFourcc::BGR3, 33, 17, 140), first, second;
-            Opened one(qvFourccText(from.fourcc).data(), 33, 17), two(qvFourccText(to.fourcc).data(), 32, 18),
-                three("BGR3", 33, 17);
-            const QvFrame& out = three.convert(two.convert(one.convert(in)));
-            for (int x = 0; x < 33 * 3; ++x)
-                ASSERT_NEAR(out.plane()[x], 140, 6) << in.str_four_cc() << qvFourccText(to.fourcc).data();
-        }
-}
-
 TEST(QvColorConverter, ConvertsAtAnySizeAndReopens) {
     const EngineScope engine;
     QvColorConverter converter(QvFourcc::I420, false, false);

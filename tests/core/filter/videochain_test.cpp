@@ -161,6 +161,26 @@ TEST_F(VideoChain, CustomFiltersStandAroundTheAutomaticOnes) {
               "logo timecode flipper cropper deinterlace scaler:i2:o1 frconvert:50:100 brightness logo");
 }
 
+TEST_F(VideoChain, TheBobbersShareOfTheRateIsCounted) {
+    const struct {
+        Rate out;
+        int front, outHeight;
+        const char* plan;
+    } rows[] = {
+        // No field is dropped, though half the lines would do.
+        {p50, 1, 288, "bobber scaler"},
+        {p50, 0, 288, "scaler bobber"},
+        {p25, 1, 288, "bobber frconvert:50:25 scaler"},
+        {Rate::f59p(), 1, 288, "bobber scaler frconvert:50:59.9401"},
+        {p25, 0, 576, "frconvert:25:12.5 bobber"},
+    };
+    for (const auto& row : rows) {
+        Job job(720, 576, i50, 720, row.outHeight, row.out);
+        job.with("customFilters", AnyVector(Any(stored("bobber", AnyDict("_front", row.front)))));
+        EXPECT_EQ(job.plan(), row.plan);
+    }
+}
+
 TEST_F(VideoChain, ConvertersOfAPluginComeBeforeTheBuiltInOnes) {
     static QvPlugin users("users", "users");
     for (const char* name : {"scaler", "frconvert"})
@@ -220,25 +240,18 @@ TEST_F(VideoChain, TellsTheEncoderWhatIsLeftToDo) {
 
 struct ViewsPipe : QvVf {
     using QvVf::QvVf;
-    int setParam(const char* name, const Any& value) override {
-        views += Any(name) == "nrViews" ? value.asInt32() : 0;
-        job = Any(name) == "jobDescription" ? value.asGeneric() : job;
-        return 0;
-    }
-    int views = 0;
-    const void* job = nullptr;
+    int setParam(const char* name, const Any& value) override { return told.set(name, value), 0; }
+    AnyDict told;
 };
 
 TEST_F(VideoChain, PicturesOfSeveralViewsHaveAPipeOfTheirOwn) {
     plugin_.add(new FakeModule<ViewsPipe>(QvModuleType::videoPipe, "mvprocess"));
     Job job(720, 576, p25, 704, 576, p25);
-    for (const int views : {0, 1, 2, 5}) {
-        const Pipe pipe(QvProcessUtil::createVideoPipeMV(job, views));
-        const auto* own = dynamic_cast<ViewsPipe*>(pipe.get());
-        ASSERT_EQ(own != nullptr, views > 1);
-        EXPECT_TRUE(!own || (own->views == views && own->job == &job));
-        EXPECT_EQ(pipe->filter(0)->getState(), 3);
-    }
+    EXPECT_FALSE(dynamic_cast<ViewsPipe*>(Pipe(QvProcessUtil::createVideoPipeMV(job, 1)).get()));
+    const Pipe pipe(QvProcessUtil::createVideoPipeMV(job, 2));
+    EXPECT_EQ(dynamic_cast<ViewsPipe&>(*pipe).told,
+              AnyDict("nrViews", 2, "jobDescription", Any(static_cast<const void*>(&job))));
+    EXPECT_EQ(pipe->filter(0)->getState(), 3);
     job.with("customFilters", AnyVector(Any(stored("logo", AnyDict("refuseOpen", -1)))));
     EXPECT_EQ(QvProcessUtil::createVideoPipeMV(job, 2), nullptr) << "it does not open";
 }
