@@ -138,7 +138,7 @@ PictureEffects::PictureEffects(const EffectOptions& options, const Source& sourc
         out_.width = size.width;
         out_.height = size.height;
     }
-    if (!options_.rate.empty()) out_.rate = parseRate(options_.rate, "--rate");
+    planRate();
     if (!options_.pixel.empty()) out_.fourcc = parsePixel(options_.pixel, "--pixel");
     planMatrix(toPng);
     if (options_.subtitles.empty() && !options_.subtitleStyle.empty())
@@ -167,6 +167,20 @@ void PictureEffects::planDeinterlace() {
     out_.rate.setInterlaced(0);
     if (deinterlace_ == "double")
         out_.rate = QvFramerate(QvRatio(in_.rate.rate().num * 2, in_.rate.rate().den));
+}
+
+void PictureEffects::planRate() {
+    if (options_.rate.empty()) return;
+    const double before = static_cast<double>(out_.rate.rate());
+    out_.rate = parseRate(options_.rate, "--rate");
+    const double after = static_cast<double>(out_.rate.rate());
+    const auto converts = [](double fps) { return fps > 0.1 && fps <= 120; };
+    if (before == after || (converts(before) && converts(after))) return;
+    char text[120];
+    std::snprintf(text, sizeof text,
+                  "--rate: %g to %g frames a second can't be converted: each may be above 0.1, up to 120",
+                  before, after);
+    throw Failure(Exit::usage, text);
 }
 
 void PictureEffects::planCrop() {

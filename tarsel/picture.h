@@ -38,6 +38,7 @@ class PictureEffects {
 
   private:
     void planDeinterlace();
+    void planRate();
     void planCrop();
     void planMatrix(bool toPng);
     void planTimecode();
