@@ -79,26 +79,33 @@ void XmlTrans::AnyToXml(const Any& from, XmlNode* to) {
     QV_ASSERT_MSG(to->name(), "node->name()");
 }
 
+bool XmlTrans::parseTyped(int type, const XmlNode* from, Any& to) {
+    switch (type) {
+        case Any::Int32: parseInt32(from, to); return true;
+        case Any::Int64: parseInt64(from, to); return true;
+        case Any::Float: parseFloat(from, to); return true;
+        case Any::String: parseString(from, to); return true;
+        case Any::WString: parseWString(from, to); return true;
+        case Any::Generic: parseGeneric(from, to); return true;
+        case Any::Dict:
+            to = AnyDict();
+            XmlToDict(from, to.asDict());
+            return true;
+        case Any::Vector: parseVector(from, to); return true;
+        case Any::Framerate: parseFramerate(from, to); return true;
+        case Any::Point: parsePoint(from, to); return true;
+        case Any::Rect: parseRect(from, to); return true;
+        case Any::Bitrate: parseBitrate(from, to); return true;
+        case Any::Pair: parsePair(from, to); return true;
+        case Any::MediaTime: parseMediaTime(from, to); return true;
+        default: return false;
+    }
+}
+
 void XmlTrans::XmlToAny(const XmlNode* from, Any& to) {
     const auto type = qvXmlTypeOf(from->name());
     if (!type) return parseObject(from, to);
-    switch (*type) {
-        case Any::Int32: return parseInt32(from, to);
-        case Any::Int64: return parseInt64(from, to);
-        case Any::Float: return parseFloat(from, to);
-        case Any::String: return parseString(from, to);
-        case Any::WString: return parseWString(from, to);
-        case Any::Generic: return parseGeneric(from, to);
-        case Any::Dict: to = AnyDict(); return XmlToDict(from, to.asDict());
-        case Any::Vector: return parseVector(from, to);
-        case Any::Framerate: return parseFramerate(from, to);
-        case Any::Point: return parsePoint(from, to);
-        case Any::Rect: return parseRect(from, to);
-        case Any::Bitrate: return parseBitrate(from, to);
-        case Any::Pair: return parsePair(from, to);
-        case Any::MediaTime: return parseMediaTime(from, to);
-        default: return to.invalidate();
-    }
+    if (!parseTyped(*type, from, to)) to.invalidate();
 }
 
 void XmlTrans::DictToXml(const AnyDict& from, XmlNode* to) {

@@ -68,6 +68,10 @@ class QV_API XmlTrans {
     void parseMediaTime(const XmlNode* from, Any& to);  // invalid unless the scale is at least 1
     // A dictionary under its class name; invalid if the element is none.
     void parseObject(const XmlNode* from, Any& to);
+
+  protected:
+    // By the type, a value of Any::Type. False if it has no element: `to` stays as it is.
+    bool parseTyped(int type, const XmlNode* from, Any& to);
 };
 
 // The compact form of dictionaries, a child an entry: <width type="i32">720</width>. Keys must be XML names;

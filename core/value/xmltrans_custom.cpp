@@ -49,21 +49,5 @@ void XmlTransCustomDict::XmlToDict(const XmlNode* from, AnyDict& to) {
 }
 
 void XmlTransCustomDict::parseItem(const XmlNode* from, Any& to, const char* type) {
-    switch (qvXmlTypeOf(type).value_or(Any::Invalid)) {
-        case Any::Int32: return parseInt32(from, to);
-        case Any::Int64: return parseInt64(from, to);
-        case Any::Float: return parseFloat(from, to);
-        case Any::String: return parseString(from, to);
-        case Any::WString: return parseWString(from, to);
-        case Any::Generic: return parseGeneric(from, to);
-        case Any::Dict: to = AnyDict(); return XmlToDict(from, to.asDict());
-        case Any::Vector: return parseVector(from, to);
-        case Any::Framerate: return parseFramerate(from, to);
-        case Any::Point: return parsePoint(from, to);
-        case Any::Rect: return parseRect(from, to);
-        case Any::Bitrate: return parseBitrate(from, to);
-        case Any::Pair: return parsePair(from, to);
-        case Any::MediaTime: return parseMediaTime(from, to);
-        default: return;
-    }
+    if (const auto known = qvXmlTypeOf(type)) parseTyped(*known, from, to);
 }

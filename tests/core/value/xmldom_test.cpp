@@ -33,6 +33,7 @@ TEST(XmlNode, dataGrowsAndFormats) {
     const std::string longText(2000, 'x');
     node.sprintf("%s", longText.c_str());
     EXPECT_EQ(node.dataSize(), 511);
+    node.addRawData(longText.c_str());
     EXPECT_EQ(node.dataSize(), 2511);
     node.sprintf("%s%d", longText.c_str(), 12);
     EXPECT_EQ(node.dataSize(), 2002);  // more room since the data has grown
