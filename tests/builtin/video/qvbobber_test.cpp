@@ -6,9 +6,9 @@
 #include <functional>
 
 #include "builtin/video/bobrows.h"
-#include "tests/builtin/kernels/targets.h"
 #include "tests/support/checks.h"
 #include "tests/support/pictures.h"
+#include "tests/support/vector_targets.h"
 
 namespace {
 

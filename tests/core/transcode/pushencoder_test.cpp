@@ -24,12 +24,12 @@ class Pushing : public OutputPipe {
         AnyDict sound("samplerate", samplerate, "channels", 2, "bitsPerSample", 16, "bufferLength",
                       bufferLength);
         ASSERT_EQ(push.setEncoder(pipe_.get()), 0);
-        if (video) addVideo(QvFourcc::I420, width, height, rate);
         if (video) {
+            addVideo(QvFourcc::I420, width, height, rate);
             ASSERT_EQ(push.addVideoStream(pictures, nullptr), 0);
         }
-        if (audio) addAudio(2, 16, samplerate);
         if (audio) {
+            addAudio(2, 16, samplerate);
             ASSERT_EQ(push.addAudioStream(sound, nullptr), 0);
         }
     }
