@@ -9,7 +9,7 @@
 #include <cstdint>
 #include <cstring>
 
-#include "tests/support/pictures.h"
+#include "tests/support/wav_bytes.h"
 
 class Guarded {
   public:

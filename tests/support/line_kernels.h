@@ -60,6 +60,26 @@ auto onLines(void (*kernel)(P...), Given... given) {
     };
 }
 
+template <class Sample>
+Sample sampleAt(const unsigned char* line, size_t i) {
+    Sample sample;
+    std::memcpy(&sample, line + i * sizeof sample, sizeof sample);
+    return sample;
+}
+
+// Runs a kernel and checks that each sample of the first output is what a formula gives for its place, which
+// sees all lines as they were before.
+template <class Sample, class Run, class Formula>
+auto checked(Run run, Formula formula) {
+    return [=](const LineCase& l) {
+        std::vector<Sample> wanted, got;
+        for (size_t i = 0; i < l.n; ++i) wanted.push_back(static_cast<Sample>(formula(l, i)));
+        run(l);
+        for (size_t i = 0; i < l.n; ++i) got.push_back(sampleAt<Sample>(l.out[0], i));
+        ASSERT_EQ(got, wanted);
+    };
+}
+
 // One line at a time, ending `gap` bytes before the page without access.
 class LineMemory {
   public:

@@ -4,15 +4,7 @@
 #include <string>
 
 #include "core/media/qvbuffer.h"
-
-// Bytes that differ from place to place and from seed to seed.
-inline void fillBytes(unsigned char* to, size_t count, unsigned seed) {
-    unsigned value = seed * 2654435761u + 1;
-    for (size_t i = 0; i < count; ++i) {
-        value = value * 1664525u + 1013904223u;
-        to[i] = static_cast<unsigned char>(value >> 24);
-    }
-}
+#include "tests/support/wav_bytes.h"
 
 // Every byte of every plane, padding included, depends on its place and on `seed`.
 inline void fillPicture(QvFrame& frame, unsigned seed) {

@@ -1,4 +1,4 @@
-// WAV files put together byte by byte.
+// Bytes of numbers and of WAV files, put together one by one, and bytes of no meaning.
 #pragma once
 
 #include <cstdint>
@@ -9,6 +9,13 @@ inline std::string leBytes(std::uint64_t value, int count) {
     std::string bytes;
     for (int i = 0; i < count; ++i) bytes.push_back(static_cast<char>(value >> 8 * i & 255));
     return bytes;
+}
+
+inline std::uint32_t leNumber(std::string_view bytes, std::size_t at, int count) {
+    std::uint32_t value = 0;
+    while (count-- > 0)
+        value = value << 8 | static_cast<unsigned char>(bytes.at(at + static_cast<std::size_t>(count)));
+    return value;
 }
 
 inline std::string wavChunk(std::string_view id, std::string_view contents) {
@@ -35,9 +42,16 @@ inline std::string riff(std::string_view chunks, std::string_view id = "RIFF") {
     return std::string(id) + leBytes(chunks.size() + 4, 4) + "WAVE" + std::string(chunks);
 }
 
-// Bytes that differ from place to place.
-inline std::string patternBytes(std::size_t count) {
+// Bytes that differ from place to place and from seed to seed.
+inline void fillBytes(unsigned char* to, std::size_t count, unsigned seed) {
+    std::uint32_t value = seed * 2654435761u + 1;
+    for (std::size_t i = 0; i < count; ++i) {
+        value = value * 1664525u + 1013904223u;
+        to[i] = static_cast<unsigned char>(value >> 24);
+    }
+}
+inline std::string patternBytes(std::size_t count, unsigned seed = 1) {
     std::string bytes(count, 0);
-    for (std::size_t i = 0; i < count; ++i) bytes[i] = static_cast<char>(i * 7 + i / 251);
+    fillBytes(reinterpret_cast<unsigned char*>(bytes.data()), count, seed);
     return bytes;
 }

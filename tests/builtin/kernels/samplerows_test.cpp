@@ -11,27 +11,25 @@
 #include "builtin/kernels/rows8.h"
 #include "builtin/kernels/scale8.h"
 #include "builtin/kernels/yuvrgb.h"
-#include "tests/support/guarded.h"
-#include "tests/support/vector_targets.h"
+#include "tests/support/line_kernels.h"
 
 using namespace srk;
 
 namespace {
 
-uint16_t wordOf(const Byte* row, size_t i) { return static_cast<uint16_t>(row[2 * i] | row[2 * i + 1] << 8); }
-
 // Weights whose sums reach up to the limits of what is allowed.
 struct Weights {
-    explicit Weights(size_t n) : scale8(n), add8(n), scale16(n), add16(n) {
+    explicit Weights(size_t n) : scale8(n), add8(n), scale16(n), add16(n), add10(n) {
         for (size_t i = 0; i < n; ++i) {
             scale8[i] = static_cast<uint16_t>(i * 37 % 257);
             add8[i] = static_cast<uint16_t>(65535 - 255 * scale8[i]);
             scale16[i] = i % 5 ? static_cast<uint32_t>(i * 7919 % 65537) : 65536;
             add16[i] = 0xFFFFFFFFu - 65535u * scale16[i];
+            add10[i] = (1024u << 16) - 1 - 1023 * scale16[i];
         }
     }
     std::vector<uint16_t> scale8, add8;
-    std::vector<uint32_t> scale16, add16;
+    std::vector<uint32_t> scale16, add16, add10;
 };
 
 std::vector<uint16_t> wordTable() {
@@ -40,69 +38,68 @@ std::vector<uint16_t> wordTable() {
     return table;
 }
 
-// All kernels on rows of n samples, as they stand or in place.
-void check(size_t n, bool inPlace, const Weights& w, const std::vector<uint16_t>& table16) {
-    Byte table8[256];
-    for (int i = 0; i < 256; ++i) table8[i] = static_cast<Byte>(i * 151 + 7);
-    Guarded in8(n, 1), in16(2 * n, 2), out8(n), out16(2 * n);
-    const auto run = [&](auto kernel, auto expected) {
-        in8.fill(1);
-        in16.fill(2);
-        const std::vector<Byte> was8(in8.data(), in8.data() + n), was16(in16.data(), in16.data() + 2 * n);
-        Byte* to8 = inPlace ? in8.data() : out8.data();
-        Byte* to16 = inPlace ? in16.data() : out16.data();
-        kernel(to8, to16);
-        for (size_t i = 0; i < n; ++i) {
-            const auto [e8, e16] = expected(was8[i], wordOf(was16.data(), i), i);
-            ASSERT_EQ(to8[i], e8) << n << " " << i;
-            ASSERT_EQ(wordOf(to16, i), e16) << n << " " << i;
-        }
-    };
-    run(
-        [&](Byte* to8, Byte* to16) {
-            weighBytes(to8, in8.data(), w.scale8.data(), w.add8.data(), n);
-            weighWords(to16, in16.data(), w.scale16.data(), w.add16.data(), n);
-        },
-        [&](unsigned b, unsigned s, size_t i) {
-            return std::pair{(b * w.scale8[i] + w.add8[i]) >> 8, (s * w.scale16[i] + w.add16[i]) >> 16};
-        });
-    for (const unsigned chosen : {15u, 5u, 10u, 7u, 14u})
-        run(
-            [&](Byte* to8, Byte* to16) {
-                lookUpBytes(to8, in8.data(), table8, chosen, n);
-                lookUpWords(to16, in16.data(), table16.data(), chosen, n);
-            },
-            [&](unsigned b, unsigned s, size_t i) {
-                const bool looked = chosen >> i % 4 & 1;
-                return looked ? std::pair<unsigned, unsigned>{table8[b], table16[s]} : std::pair{b, s};
-            });
-    Guarded in10(4 * (n / 3), 3), out10(4 * (n / 3));
-    Guarded& to10 = inPlace ? in10 : out10;
-    std::vector<uint32_t> add(w.add16);
-    for (size_t i = 0; i < n; ++i) add[i] = (1024u << 16) - 1 - 1023 * w.scale16[i];
-    const std::vector<Byte> was(in10.data(), in10.data() + 4 * (n / 3));
-    weighTens(to10.data(), in10.data(), w.scale16.data(), add.data(), n / 3);
-    for (size_t i = 0; i < n / 3 * 3; ++i) {
-        const auto tens = [&](const Byte* row) {
-            uint32_t word;
-            std::memcpy(&word, row + i / 3 * 4, 4);
-            return word >> 10 * (i % 3) & 1023;
-        };
-        ASSERT_EQ(tens(to10.data()), (tens(was.data()) * w.scale16[i] + add[i]) >> 16) << n << " " << i;
-    }
-    for (const Guarded* row : {&in8, &in16, &out8, &out16, &in10, &out10}) EXPECT_TRUE(row->frontIntact());
-}
+const Weights weights(3 * 129);
+const std::vector<uint16_t> table16 = wordTable();
+
+unsigned tens(const Byte* row, size_t i) { return sampleAt<uint32_t>(row, i / 3) >> 10 * (i % 3) & 1023; }
 
 }  // namespace
 
 TEST(SampleRows, AllUnitsFollowTheFormulas) {
-    const auto table16 = wordTable();
-    const Weights weights(200);
-    for (const int64_t target : machineTargets()) {
-        const OnTarget on(target);
-        for (size_t n = 0; n < 140; n += n < 70 ? 1 : 13)
-            for (const bool inPlace : {false, true}) check(n, inPlace, weights, table16);
+    std::vector<LineKernel> rows = {
+        {"weigh bytes",
+         {one},
+         {one},
+         checked<Byte>(
+             [](auto& l) { weighBytes(l.out[0], l.in[0], weights.scale8.data(), weights.add8.data(), l.n); },
+             [](auto& l, size_t i) { return (l.in[0][i] * weights.scale8[i] + weights.add8[i]) >> 8; }),
+         true},
+        {"weigh words",
+         {twoBytes},
+         {twoBytes},
+         checked<uint16_t>(
+             [](auto& l) {
+                 weighWords(l.out[0], l.in[0], weights.scale16.data(), weights.add16.data(), l.n);
+             },
+             [](auto& l, size_t i) {
+                 return (sampleAt<uint16_t>(l.in[0], i) * weights.scale16[i] + weights.add16[i]) >> 16;
+             }),
+         true},
+        {"weigh tens",
+         {four},
+         {four},
+         [](const LineCase& l) {
+             std::vector<unsigned> wanted;
+             for (size_t i = 0; i < 3 * l.n; ++i)
+                 wanted.push_back((tens(l.in[0], i) * weights.scale16[i] + weights.add10[i]) >> 16);
+             weighTens(l.out[0], l.in[0], weights.scale16.data(), weights.add10.data(), l.n);
+             for (size_t i = 0; i < 3 * l.n; ++i) ASSERT_EQ(tens(l.out[0], i), wanted[i]) << i;
+         },
+         true},
+    };
+    static Byte table8[256];
+    for (int i = 0; i < 256; ++i) table8[i] = static_cast<Byte>(i * 151 + 7);
+    for (const unsigned chosen : {15u, 5u, 10u, 7u, 14u}) {
+        rows.push_back({"look up bytes",
+                        {one},
+                        {one},
+                        checked<Byte>([=](auto& l) { lookUpBytes(l.out[0], l.in[0], table8, chosen, l.n); },
+                                      [=](auto& l, size_t i) {
+                                          return chosen >> i % 4 & 1 ? table8[l.in[0][i]] : l.in[0][i];
+                                      }),
+                        true});
+        rows.push_back(
+            {"look up words",
+             {twoBytes},
+             {twoBytes},
+             checked<uint16_t>([=](auto& l) { lookUpWords(l.out[0], l.in[0], table16.data(), chosen, l.n); },
+                               [=](auto& l, size_t i) {
+                                   const auto sample = sampleAt<uint16_t>(l.in[0], i);
+                                   return chosen >> i % 4 & 1 ? table16[sample] : sample;
+                               }),
+             true});
     }
+    compareUnits(rows);
 }
 
 TEST(Units, OfTheMachineReallyRun) {

@@ -8,13 +8,6 @@
 
 namespace {
 
-unsigned little(const std::string& bytes, size_t at, int width) {
-    unsigned value = 0;
-    for (int i = width; i-- > 0;)
-        value = value << 8 | static_cast<unsigned char>(bytes[at + static_cast<size_t>(i)]);
-    return value;
-}
-
 class RawMuxing : public OutputPipe {
   protected:
     void streams(int videos, int audios) {
@@ -87,11 +80,11 @@ TEST_F(RawMuxing, WavHoldsExactlyTheSamples) {
                     EXPECT_TRUE(content.substr(80) == expected);
                     EXPECT_EQ(content.substr(0, 4) + content.substr(8, 4) + content.substr(72, 4),
                               "RIFFWAVEdata");
-                    EXPECT_EQ(little(content, 4, 4), content.size() - 8);
-                    EXPECT_EQ(little(content, 22, 2), splits ? 1u : channels);
-                    EXPECT_EQ(little(content, 24, 4), 44100u);
-                    EXPECT_EQ(little(content, 34, 2), bits);
-                    EXPECT_EQ(little(content, 76, 4), expected.size());
+                    EXPECT_EQ(leNumber(content, 4, 4), content.size() - 8);
+                    EXPECT_EQ(leNumber(content, 22, 2), splits ? 1u : channels);
+                    EXPECT_EQ(leNumber(content, 24, 4), 44100u);
+                    EXPECT_EQ(leNumber(content, 34, 2), bits);
+                    EXPECT_EQ(leNumber(content, 76, 4), expected.size());
                 }
             }
 }
@@ -134,7 +127,7 @@ TEST_F(RawMuxing, V210) {
                 const QvFrame& source = pictures[i / height];
                 const auto* row = source.plane(0) + i % height * static_cast<size_t>(source.stride(0));
                 for (size_t k = 0; k < 2 * width; ++k) {
-                    const unsigned ten = little(content, i * line + k / 3 * 4, 4) >> (k % 3 * 10) & 0x3FF;
+                    const unsigned ten = leNumber(content, i * line + k / 3 * 4, 4) >> (k % 3 * 10) & 0x3FF;
                     const unsigned char* sixteen = row + (k ^ 1) * 2;
                     ASSERT_NEAR(static_cast<int>(ten), (sixteen[0] | sixteen[1] << 8) >> 6, 1)
                         << "row " << i << " sample " << k;

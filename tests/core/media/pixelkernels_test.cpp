@@ -5,76 +5,53 @@
 
 namespace {
 
-// Works on the first line with the second one and, of one byte a sample, the third; reference(target, source,
-// extra byte) is a sample's result.
-template <class Sample, class Kernel, class Reference>
-auto checked(Kernel kernel, Reference reference) {
-    return [=](const LineCase& l) {
-        const auto sample = [](const unsigned char* line, size_t i) {
-            Sample value;
-            std::memcpy(&value, line + i * sizeof value, sizeof value);
-            return int{value};
-        };
-        std::vector<int> wanted, got;
-        for (size_t i = 0; i < l.n; ++i)
-            wanted.push_back(reference(sample(l.in[0], i), sample(l.in[1], i), l.in[2] ? l.in[2][i] : 0));
-        kernel(l.in[0], l.in[1], l.in[2], l.n);
-        for (size_t i = 0; i < l.n; ++i) got.push_back(sample(l.in[0], i));
-        EXPECT_EQ(got, wanted);
-    };
-}
+using qvpixels::Byte;
 
-int masked(int target, int source, int mask) {
-    const int w = (mask + 1) >> 1;
-    return (target * (128 - w) + source * w) >> 7;
+template <class Sample>
+void addRows(std::vector<LineKernel>& rows, LineSize size,
+             void (*average)(Byte*, const Byte*, const Byte*, size_t),
+             void (*mask)(Byte*, const Byte*, const Byte*, size_t),
+             void (*mix)(Byte*, const Byte*, int, size_t)) {
+    rows.push_back(
+        {"average",
+         {size, size},
+         {size},
+         checked<Sample>(onLines(average),
+                         [](auto& l, size_t i) {
+                             return (sampleAt<Sample>(l.in[0], i) + sampleAt<Sample>(l.in[1], i)) >> 1;
+                         }),
+         true});
+    rows.push_back({"mask", {size, one}, {size}, checked<Sample>(onLines(mask), [](auto& l, size_t i) {
+                        const int weight = (l.in[1][i] + 1) >> 1;
+                        return (sampleAt<Sample>(l.out[0], i) * (128 - weight) +
+                                sampleAt<Sample>(l.in[0], i) * weight) >>
+                               7;
+                    })});
+    for (const int alpha : {0, 1, 127, 128, 254, 255})
+        rows.push_back({"mix", {size}, {size}, checked<Sample>(onLines(mix, alpha), [=](auto& l, size_t i) {
+                            return (sampleAt<Sample>(l.out[0], i) * (256 - alpha) +
+                                    sampleAt<Sample>(l.in[0], i) * alpha) >>
+                                   8;
+                        })});
 }
 
 }  // namespace
 
-TEST(PixelKernels, MaskMixAndAverageInPlace) {
-    std::vector<LineKernel> kernels = {
-        {"mask bytes", {one, one, one}, {}, checked<uint8_t>(qvpixels::maskBytes, masked)},
-        {"mask words", {twoBytes, twoBytes, one}, {}, checked<uint16_t>(qvpixels::maskWords, masked)},
-    };
-    for (const int alpha : {0, 1, 127, 128, 254, 255}) {
-        const auto mixed = [=](int target, int source, int) {
-            return (target * (256 - alpha) + source * alpha) >> 8;
-        };
-        const auto with = [=](auto kernel) {
-            return [=](auto* to, auto* from, auto*, size_t n) { kernel(to, from, alpha, n); };
-        };
-        kernels.push_back({"mix bytes", {one, one}, {}, checked<uint8_t>(with(qvpixels::mixBytes), mixed)});
-        kernels.push_back(
-            {"mix words", {twoBytes, twoBytes}, {}, checked<uint16_t>(with(qvpixels::mixWords), mixed)});
-    }
-    const auto inPlace = [](auto kernel) {
-        return [=](auto* to, auto* from, auto*, size_t n) { kernel(to, to, from, n); };
-    };
-    const auto mean = [](int target, int source, int) { return (target + source) / 2; };
-    kernels.push_back(
-        {"average bytes", {one, one}, {}, checked<uint8_t>(inPlace(qvpixels::averageBytes), mean)});
-    kernels.push_back({"average words",
-                       {twoBytes, twoBytes},
-                       {},
-                       checked<uint16_t>(inPlace(qvpixels::averageWords), mean)});
-    compareUnits(kernels, hwy::SupportedAndGeneratedTargets());
-}
-
-TEST(PixelKernels, SpreadMask) {
-    std::vector<LineKernel> kernels;
+TEST(PixelKernels, FollowTheirFormulas) {
+    std::vector<LineKernel> rows;
+    addRows<uint8_t>(rows, one, qvpixels::averageBytes, qvpixels::maskBytes, qvpixels::mixBytes);
+    addRows<uint16_t>(rows, twoBytes, qvpixels::averageWords, qvpixels::maskWords, qvpixels::mixWords);
     for (size_t step : {1u, 2u})
         for (size_t copies = 1; copies <= 4; ++copies)
-            kernels.push_back({"spread", {{step}}, {{copies}}, [=](const LineCase& l) {
-                                   qvpixels::spreadMask(l.out[0], l.in[0], static_cast<int>(step),
-                                                        static_cast<int>(copies), l.n);
-                                   for (size_t i = 0; i < copies * l.n; ++i)
-                                       ASSERT_EQ(l.out[0][i], l.in[0][i / copies * step]) << copies;
-                               }});
-    compareUnits(kernels, hwy::SupportedAndGeneratedTargets());
-}
-
-TEST(PixelKernels, UnitsOfTheMachineReallyRun) {
-    for (const auto target : hwy::SupportedAndGeneratedTargets()) {
+            rows.push_back({"spread", {{step}}, {{copies}}, [=](const LineCase& l) {
+                                qvpixels::spreadMask(l.out[0], l.in[0], static_cast<int>(step),
+                                                     static_cast<int>(copies), l.n);
+                                for (size_t i = 0; i < copies * l.n; ++i)
+                                    ASSERT_EQ(l.out[0][i], l.in[0][i / copies * step]) << copies;
+                            }});
+    const auto targets = hwy::SupportedAndGeneratedTargets();
+    compareUnits(rows, targets);
+    for (const auto target : targets) {
         const OnTarget only(target);
         EXPECT_STREQ(qvpixels::vectorUnit(), hwy::TargetName(target));
     }

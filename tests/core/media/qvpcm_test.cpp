@@ -5,7 +5,6 @@
 #include "core/engine/status.h"
 #include "tests/support/checks.h"
 #include "tests/support/pictures.h"
-#include "tests/support/wav_bytes.h"
 
 namespace {
 

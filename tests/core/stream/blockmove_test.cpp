@@ -21,8 +21,8 @@ TEST(BlockMove, PutsTheBlockBehindTheHead) {
                             {5, 2 * mib, 0, true}}) {
         for (const int abort : {0, 1}) {
             TempFolder folder;
-            const std::string head = pattern(l.head, 1), body = pattern(l.body, 2),
-                              block = pattern(l.block, 3);
+            const std::string head = patternBytes(l.head, 1), body = patternBytes(l.body, 2),
+                              block = patternBytes(l.block, 3);
             QvFileBufStream stream;
             ASSERT_EQ(stream.init(AnyDict("outfilename", folder.file("m.mov").c_str())), 0);
             bufstream* in = stream.input();
@@ -38,7 +38,7 @@ TEST(BlockMove, PutsTheBlockBehindTheHead) {
 }
 
 TEST(BlockMove, ExtentsThatAreNotTheFilesLeaveItAlone) {
-    const std::string content = pattern(3 << 20);
+    const std::string content = patternBytes(3 << 20);
     const uint64_t size = content.size(), huge = ~uint64_t{0};
     for (const BufReorderInfo& bad : {BufReorderInfo{{0, 10, 0}, {size - 5, 10, 0}, {10, size - 15, 0}},
                                       {{0, 10, 0}, {size - 5, 5, 0}, {20, size - 25, 0}},

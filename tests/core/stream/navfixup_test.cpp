@@ -91,7 +91,7 @@ Texts multiplex(const Program& program, Texts* before = nullptr) {
         };
         append(program.audio, NAV_AUDIO_LIST_APPEND);
         append(program.subpics, NAV_SUBPIC_LIST_APPEND);
-        const std::string data = pattern(vobu.sectors * sectorBytes, static_cast<unsigned>(i + 1));
+        const std::string data = patternBytes(vobu.sectors * sectorBytes, static_cast<unsigned>(i + 1));
         copyIn(in, data);
         plain.back() += data;
         sector += vobu.sectors;
@@ -213,7 +213,7 @@ TEST(NavigationFixup, SkippedOnWishAndBoundedInLength) {
     bufstream* in = stream.input();
     EXPECT_EQ(tell(in, NAV_CELL_START), 0u) << "before gathering nothing is kept";
     tell(in, NAV_COLLECT_BEGIN);
-    const std::string sector = pattern(sectorBytes);
+    const std::string sector = patternBytes(sectorBytes);
     for (uint32_t i = 0; i < 50'402; ++i) {
         const uint32_t info[3] = {i, halfSecond, 1};
         tell(in, NAV_VOBU_INFO, info);
@@ -236,7 +236,7 @@ TEST(NavigationFixup, AFileThatIsShorterThanItsUnitsIsTold) {
         const uint32_t info[3] = {sector, halfSecond, 1};
         tell(in, NAV_VOBU_INFO, info);
     }
-    copyIn(in, pattern(sectorBytes));
+    copyIn(in, patternBytes(sectorBytes));
     stream.destroy(0);
     EXPECT_NE(stream.ioError(), 0);
     EXPECT_EQ(TempFolder::read(folder.file("a.vob")).size(), sectorBytes);

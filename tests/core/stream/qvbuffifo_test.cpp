@@ -157,12 +157,12 @@ TEST(QvBufStreamFifoCb, CallsAtTheThresholdAndStopsOnWish) {
     ASSERT_EQ(fifo.init(ring(1004, 500)), 0);
     ASSERT_EQ(fifo.init(AnyDict("size", 400, "chunk", 201, "callback", 100)), 0);
     bufstream* in = fifo.input();
-    const std::string sixty = pattern(60), forty = pattern(40);
+    const std::string sixty = patternBytes(60), forty = patternBytes(40);
     ASSERT_TRUE(put(in, sixty));
     EXPECT_TRUE(fifo.calls.empty());
     ASSERT_EQ(copyIn(in, forty), 40u);
     EXPECT_THAT(fifo.calls, testing::ElementsAre(100));
-    for (int i = 0; i < 100; ++i) ASSERT_TRUE(put(in, pattern(99, static_cast<unsigned>(i)))) << i;
+    for (int i = 0; i < 100; ++i) ASSERT_TRUE(put(in, patternBytes(99, static_cast<unsigned>(i)))) << i;
     EXPECT_EQ(fifo.text.substr(0, 100), sixty + forty);
 
     qv_log()->clear();

@@ -28,7 +28,7 @@ struct MemOut {
 TEST(QvMemOutStream, CutsAccessUnitsOutOfTheRing) {
     MemOut out;
     EXPECT_EQ(out.stream.output(), nullptr);
-    const std::string data = pattern(20);
+    const std::string data = patternBytes(20);
     ASSERT_TRUE(put(out.in, data));
     const uint32_t info[8] = {10, 11, 12, 13, 14, 15, 16, 17};
     EXPECT_EQ(tell(out.in, VIDEO_AU_CODE, info), 0u);
@@ -46,7 +46,7 @@ TEST(QvMemOutStream, CutsAccessUnitsOutOfTheRing) {
 
 TEST(QvMemOutStream, UnitsLargerThanAChunkComeOutWholeAlsoOverTheEnd) {
     MemOut out;
-    const std::string large = pattern(900'000);
+    const std::string large = patternBytes(900'000);
     for (int round = 0; round < 9; ++round) {
         for (size_t at = 0; at < large.size();) {
             const size_t piece = std::min<size_t>(out.in->chunksize(out.in), large.size() - at);
@@ -81,7 +81,7 @@ TEST(QvMemOutStream, MisuseIsAssertedAndLosesNothing) {
     EXPECT_THROW(out.in->auxinfo(out.in, 0, VIDEO_AU_CODE, nullptr, 4), QvAssertFailure);
     EXPECT_THROW(tell(out.in, VIDEO_AU_CODE, 11u), QvAssertFailure) << "more than was written";
     EXPECT_THROW(out.in->request(out.in, 0), QvAssertFailure);
-    EXPECT_THROW(copyIn(out.in, pattern(262'145)), QvAssertFailure);
+    EXPECT_THROW(copyIn(out.in, patternBytes(262'145)), QvAssertFailure);
     EXPECT_EQ(out.queue.hasData(), 0);
     tell(out.in, VIDEO_AU_CODE, 10u);
     EXPECT_EQ(payloadOf(out.queue.popData()), "0123456789");
@@ -93,7 +93,7 @@ TEST(QvAuxinfoQueue, HandsUnitsFromOneThreadToAnother) {
     std::thread writer([&] {
         for (uint32_t i = 0; i < units; ++i) {
             const uint32_t info[2] = {i % 600 + 4, i};
-            put(out.in, pattern(info[0], i));
+            put(out.in, patternBytes(info[0], i));
             tell(out.in, VIDEO_AU_CODE, info);
         }
         tell(out.in, STREAM_END_CODE);
@@ -106,7 +106,7 @@ TEST(QvAuxinfoQueue, HandsUnitsFromOneThreadToAnother) {
         if (item.infoId() == int{STREAM_END_CODE}) break;
         const auto* info = static_cast<const uint32_t*>(item.info());
         ASSERT_EQ(info[1], received);
-        ASSERT_TRUE(payloadOf(item) == pattern(info[0], received)) << "unit " << received;
+        ASSERT_TRUE(payloadOf(item) == patternBytes(info[0], received)) << "unit " << received;
         ++received;
     }
     writer.join();

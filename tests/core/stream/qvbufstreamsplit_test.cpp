@@ -8,7 +8,6 @@
 #include "core/media/qvimage.h"
 #include "core/stream/wavheader_p.h"
 #include "streamtools.h"
-#include "tests/support/wav_bytes.h"
 
 namespace {
 
@@ -43,11 +42,11 @@ TEST(QvBsSplitVideo, EachUnitIsAFileWithANumber) {
         TempFolder folder;
         QvBsSplitVideo stream;
         ASSERT_EQ(stream.init(with(pictures(folder), "nrDigits", digits)), 0);
-        unit(stream, VIDEO_AU_CODE, pattern(2000, 1));  // larger than a chunk
+        unit(stream, VIDEO_AU_CODE, patternBytes(2000, 1));  // larger than a chunk
         unit(stream, VIDEO_AU_CODE, "");
         stream.destroy(0);
         EXPECT_EQ(namesIn(folder), names);
-        EXPECT_TRUE(TempFolder::read(folder.file(names[0])) == pattern(2000, 1));
+        EXPECT_TRUE(TempFolder::read(folder.file(names[0])) == patternBytes(2000, 1));
         EXPECT_EQ(TempFolder::read(folder.file(names[1])), "");
     }
 }
@@ -57,9 +56,9 @@ TEST(QvBsSplitVideo, UnitsRunOverTheEndOfTheRing) {
     QvBsSplitVideo stream;
     ASSERT_EQ(stream.init(with(pictures(folder), "split", 1)), 0);
     for (unsigned i = 0; i < 20; ++i) {
-        unit(stream, VIDEO_AU_CODE, pattern(1500 + i, i));
+        unit(stream, VIDEO_AU_CODE, patternBytes(1500 + i, i));
         const std::string name = folder.file("clip#" + std::to_string(i) + ".m2v");
-        EXPECT_TRUE(TempFolder::read(name) == pattern(1500 + i, i)) << i;
+        EXPECT_TRUE(TempFolder::read(name) == patternBytes(1500 + i, i)) << i;
     }
 }
 
@@ -80,7 +79,7 @@ TEST(QvBsSplitVideo, FailuresStopTheRingAndUseUpANumber) {
     ASSERT_EQ(stream.init(pictures(folder)), 0);
     EXPECT_EQ(stream.ioError(), 0);
     std::filesystem::remove(folder.file("clip#0.m2v"));
-    unit(stream, VIDEO_AU_CODE, pattern(300));
+    unit(stream, VIDEO_AU_CODE, patternBytes(300));
     EXPECT_EQ(stream.ioError(), ENOSPC);
     EXPECT_FALSE(stream.input()->request(stream.input(), 1));
 }
@@ -88,7 +87,7 @@ TEST(QvBsSplitVideo, FailuresStopTheRingAndUseUpANumber) {
 TEST(QvBsSplitVideo, PicturesBecomePng) {
     TempFolder folder;
     QvFrame picture;
-    const std::string pixels = pattern(20 * 92);  // rows of 90 bytes end at a multiple of 4
+    const std::string pixels = patternBytes(20 * 92);  // rows of 90 bytes end at a multiple of 4
     QvBsSplitVideo stream;
     AnyDict params("outfilename", folder.file("p.raw").c_str(), "size", 10'000, "chunk", 4000);
     params.update(
@@ -108,7 +107,7 @@ TEST(QvBsSplitVideo, PicturesBecomePng) {
     tell(stream.input(), VIDEO_AU_CODE, 5u);
     EXPECT_FALSE(stream.input()->request(stream.input(), 1)) << "a picture that is too short stops the ring";
     ASSERT_EQ(stream.init(), 0);
-    EXPECT_THROW(unit(stream, VIDEO_AU_CODE, pattern(4000)), QvAssertFailure) << "larger than a chunk";
+    EXPECT_THROW(unit(stream, VIDEO_AU_CODE, patternBytes(4000)), QvAssertFailure) << "larger than a chunk";
 }
 
 // --- WAV
@@ -118,19 +117,13 @@ AnyDict wav(const TempFolder& folder, int rate, int channels, int bits, int spli
                    "bitsPerSample", bits, "split", split, "size", 20'000, "chunk", 1001);
 }
 
-uint32_t le(const std::string& bytes, size_t at, size_t width) {
-    uint32_t value = 0;
-    for (size_t i = width; i-- > 0;) value = value << 8 | static_cast<unsigned char>(bytes[at + i]);
-    return value;
-}
-
 TEST(QvBsSplitAudio, HeaderStatesTheStreamExactly) {
     for (const auto& [rate, channels, bits, width] :
          {std::tuple{48'000u, 2u, 16u, 2u}, {96'000, 6, 24, 3}, {48'000, 2, 20, 3}}) {
         TempFolder folder;
         QvBsSplitAudio stream;
         ASSERT_EQ(stream.init(wav(folder, int(rate), int(channels), int(bits))), 0);
-        const std::string samples = pattern(width * channels * 100), name = folder.file("take.wav");
+        const std::string samples = patternBytes(width * channels * 100), name = folder.file("take.wav");
         unit(stream, AUDIO_AU_CODE, std::string_view(samples).substr(0, 700));  // may end inside a sample
         unit(stream, AUDIO_AU_CODE, std::string_view(samples).substr(std::min<size_t>(700, samples.size())));
         tell(stream.input(), STREAM_END_CODE);
@@ -153,7 +146,7 @@ TEST(QvBsSplitAudio, EachChannelIsAMonoFile) {
         QvBsSplitAudio stream;
         ASSERT_EQ(stream.init(wav(folder, 100, 3, bits, 1)), 0);
         const size_t width = static_cast<size_t>((bits + 7) / 8);
-        const std::string samples = pattern(width * 3 * 700);
+        const std::string samples = patternBytes(width * 3 * 700);
         for (size_t at = 0; at < samples.size();
              at += 5000)  // units end inside samples, and hold above a second
             unit(stream, AUDIO_AU_CODE, std::string_view(samples).substr(at, 5000));
@@ -164,8 +157,8 @@ TEST(QvBsSplitAudio, EachChannelIsAMonoFile) {
             std::string channel;
             for (size_t i = 0; i < 700; ++i) channel += samples.substr((i * 3 + c) * width, width);
             ASSERT_TRUE(file.substr(80) == channel) << bits << " bits, channel " << c;
-            EXPECT_EQ(le(file, 22, 2), 1u);
-            EXPECT_EQ(le(file, 68, 4), 700u);
+            EXPECT_EQ(leNumber(file, 22, 2), 1u);
+            EXPECT_EQ(leNumber(file, 68, 4), 700u);
         }
         EXPECT_EQ(stream.ioError(), 0);
         EXPECT_EQ(copyIn(stream.input(), "abc"), 3u);
@@ -184,7 +177,7 @@ TEST(QvBsSplitAudio, AStreamThatEndsInsideASampleIsTold) {
     EXPECT_EQ(qv_log()->nrWarnings(), 1);
     const std::string file = TempFolder::read(folder.file("take.wav"));
     EXPECT_EQ(file.substr(80), "01234567");
-    EXPECT_EQ(le(file, 76, 4), 8u);
+    EXPECT_EQ(leNumber(file, 76, 4), 8u);
 }
 
 TEST(QvBsSplitAudio, RefusesWhatNoWavCanHold) {
@@ -210,7 +203,7 @@ TEST(QvBsSplitAudio, AFullDiscStopsTheRing) {
         ASSERT_EQ(stream.init(wav(folder, 1000, 2, 16, split)), 0);
         int units = 0;
         while (units < 100 && stream.input()->request(stream.input(), 1)) {
-            unit(stream, AUDIO_AU_CODE, pattern(4000));
+            unit(stream, AUDIO_AU_CODE, patternBytes(4000));
             ++units;
         }
         EXPECT_LT(units, 40);
@@ -222,7 +215,7 @@ TEST(WavHeader, SizesBeyondFourGibAreTheLargestAndTold) {
     const WavFormat stereo = {48'000, 2, 16};
     const auto field = [&](uint64_t fileBytes, size_t at) {
         const auto header = wavHeader(stereo, fileBytes);
-        return le(std::string(header.begin(), header.end()), at, 4);
+        return leNumber(std::string(header.begin(), header.end()), at, 4);
     };
     constexpr uint64_t most = 0xFFFFFFFF;
     EXPECT_EQ(field(most + 8, 4), most);
@@ -240,8 +233,8 @@ TEST(WavHeader, SizesBeyondFourGibAreTheLargestAndTold) {
     std::ifstream in(name, std::ios::binary);
     std::string header(80, '\0');
     in.read(header.data(), 80);
-    EXPECT_EQ(le(header, 4, 4), most);
-    EXPECT_EQ(le(header, 76, 4), most + 9 - 80);
+    EXPECT_EQ(leNumber(header, 4, 4), most);
+    EXPECT_EQ(leNumber(header, 76, 4), most + 9 - 80);
     EXPECT_FALSE(writeWavHeader(qv_wide_name(folder.file("none.wav")), stereo, failure));
     EXPECT_EQ(failure.code(), ENOENT);
 }

@@ -38,7 +38,8 @@ TEST_F(FileStream, WritesBlocksAndBytesInOrder) {
     bufstream* in = begin();
     std::string expected;
     for (unsigned i = 0; i < 40; ++i) {
-        const std::string block = pattern(i % 65, i), more = pattern(i % 3 ? 0 : i * 7 % 200, i + 100);
+        const std::string block = patternBytes(i % 65, i),
+                          more = patternBytes(i % 3 ? 0 : i * 7 % 200, i + 100);
         ASSERT_TRUE(put(in, block));
         ASSERT_EQ(copyIn(in, more), more.size());
         expected += block + more;
@@ -50,7 +51,7 @@ TEST_F(FileStream, WritesBlocksAndBytesInOrder) {
 
 TEST_F(FileStream, AFullBufferLeavesRoom) {
     bufstream* in = begin();
-    ASSERT_TRUE(put(in, pattern(60)));
+    ASSERT_TRUE(put(in, patternBytes(60)));
     EXPECT_EQ(usable(in), 4u);
     ASSERT_TRUE(put(in, "abcd"));
     EXPECT_GT(usable(in), 0u) << "a writer that takes what is usable must get on";
@@ -143,7 +144,7 @@ TEST_F(FileStream, AFullDiscReachesTheWriterAndWhoeverCloses) {
     qv_log()->clear();
     bufstream* in = begin("full.bin", 4000);
     int blocks = 0;
-    while (blocks < 100 && put(in, pattern(3000))) ++blocks;
+    while (blocks < 100 && put(in, patternBytes(3000))) ++blocks;
     EXPECT_LT(blocks, 8);
     EXPECT_TRUE(!in->request(in, 1) && copyIn(in, "x") == 0);
     EXPECT_EQ(stream.ioError(), ENOSPC);
@@ -200,7 +201,7 @@ TEST_F(FileStream, FlushEndsThePatchesWhileTheFileIsOpen) {
 }
 
 TEST_F(FileStream, ReadsByBlocksAndBytes) {
-    const std::string content = pattern(1000);
+    const std::string content = patternBytes(1000);
     ASSERT_EQ(stream.init(source(folder.write("a.bin", content), 100)), 0);
     bufstream* out = stream.output();
     EXPECT_EQ(ask<uint64_t>(out, FILE_SIZE_INFO), 1000u);
@@ -219,7 +220,7 @@ TEST_F(FileStream, ReadsByBlocksAndBytes) {
 
 TEST_F(FileStream, SwapsPairsWhateverTheLengthOfTheReads) {
     for (const size_t length : {1000u, 1001u}) {
-        const std::string content = pattern(length);
+        const std::string content = patternBytes(length);
         std::string swapped = content;
         for (size_t i = 0; i + 1 < length; i += 2) std::swap(swapped[i], swapped[i + 1]);
         for (const int size : {7, 64, 99}) {

@@ -1,13 +1,13 @@
 // Short forms for driving bufstream records in tests.
 #pragma once
 
-#include <cstdint>
 #include <cstring>
 #include <string_view>
 
 #include "core/stream/bufstream.h"
 #include "core/stream/qvbufstrm.h"
 #include "tests/support/checks.h"
+#include "tests/support/wav_bytes.h"
 
 inline unsigned char* bytesOf(std::string_view text) {
     return reinterpret_cast<unsigned char*>(const_cast<char*>(text.data()));
@@ -55,17 +55,6 @@ T ask(bufstream* bs, unsigned id) {
     T value{};
     bs->auxinfo(bs, 0, id, &value, sizeof value);
     return value;
-}
-
-// `count` bytes that differ from place to place.
-inline std::string pattern(size_t count, unsigned seed = 1) {
-    std::string text(count, '\0');
-    uint32_t state = seed * 2654435761u + 1;
-    for (char& c : text) {
-        state = state * 1664525u + 1013904223u;
-        c = static_cast<char>(state >> 24);
-    }
-    return text;
 }
 
 class HeardItems : public QvAuxInfoObserver {
