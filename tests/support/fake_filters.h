@@ -20,6 +20,7 @@ class AnyParamFilter : public Base {
     using Base::Base;
     using Base::getParam;
 
+    const char* name() const override { return label ? label : Base::name(); }
     int setParam(const char* name, const Any& value) override {
         if (name[0] == '_' && name != std::string("_needsReport")) seen.set(name, value);
         if (name[0] == '_' && known.isSet(name) == false) return Base::setParam(name, value);
@@ -52,6 +53,7 @@ class AnyParamFilter : public Base {
         return known.getInt32("refuseClose", 0);
     }
 
+    const char* label = nullptr;  // a name of its own
     AnyDict known;
     AnyDict seen;  // framework parameters that came
     int openResult = 0;

@@ -8,14 +8,12 @@
 #include "core/media/qvgeometry.h"
 #include "core/stream/auxinfoid.h"
 #include "tests/support/checks.h"
-#include "tests/support/log_capture.h"
 #include "tests/support/pictures.h"
 #include "tests/support/test_stream.h"
 
 namespace {
 
-class RawVideo : public testing::Test {
-  protected:
+struct RawVideo : testing::Test {
     RawVideo() { enc().init(); }
     ~RawVideo() override { enc_.reset(); }
 

@@ -128,8 +128,7 @@ class AviReader {
     std::vector<Chunk> super_;
 };
 
-class RawAvi : public OutputPipe {
-  protected:
+struct RawAvi : OutputPipe {
     RawAvi() : OutputPipe("out.avi") {
         EXPECT_EQ(pipe_->applyPreset(QvProfile::aviRaw, 0), 0);
         pipe_->clearStreams();

@@ -9,14 +9,11 @@
 #include "core/preset/qvprofile.h"
 #include "tests/support/checks.h"
 #include "tests/support/failing_codecs.h"
-#include "tests/support/log_capture.h"
 #include "tests/support/pictures.h"
-#include "tests/support/temp_folder.h"
 
 namespace {
 
-class EncodePipeTest : public testing::Test {
-  protected:
+struct EncodePipeTest : testing::Test {
     QvEncodePipe& pipe() { return *pipe_; }
     Any get(const char* name) { return static_cast<const QvCodec&>(*pipe_).getParam(name); }
     AnyDict state() {
@@ -179,9 +176,8 @@ TEST_F(EncodePipeTest, AnalysisWithoutOutput) {
     ASSERT_EQ(pipe().setMuxer("nullmux"), 0);
     EXPECT_STREQ(pipe().sink()->name(), "nullsink");
     ASSERT_EQ(pipe().addVideoStream("rawvenc") + pipe().addAudioStream("rawaenc"), 0);
-    pipe().setParam("video0",
-                    AnyDict("type", static_cast<int>(QvFourcc::BGR4), "width", 1920, "height", 1080));
-    QvFrame frame = makePicture(QvFourcc::BGR4, 1920, 1080);
+    pipe().setParam("video0", AnyDict("type", static_cast<int>(QvFourcc::BGR4), "width", 64, "height", 48));
+    QvFrame frame = makePicture(QvFourcc::BGR4, 64, 48);
     QvPcm pcm;
     fillSound(pcm, 48000, 2, 2, 48000);
     for (int run = 0; run < 2; ++run) {

@@ -5,9 +5,7 @@
 #include "core/encode/qvencodepipe.h"
 #include "tests/support/checks.h"
 #include "tests/support/failing_codecs.h"
-#include "tests/support/log_capture.h"
 #include "tests/support/pictures.h"
-#include "tests/support/temp_folder.h"
 
 namespace {
 

@@ -3,27 +3,24 @@
 #include "tests/support/checks.h"
 #include "tests/support/fake_filters.h"
 #include "tests/support/fake_streams.h"
-#include "tests/support/log_capture.h"
 #include "tests/support/pictures.h"
 
 namespace {
-
-struct Named : FakeVideoFilter {
-    explicit Named(const char* name) : name_(name) {}
-    const char* name() const override { return name_; }
-    const char* name_;
-};
 
 // A pipe of filters by name; "+" in front of it makes one that works in place.
 struct Pipe : QvVf {
     explicit Pipe(const std::vector<const char*>& names, bool safe = false) {
         for (const char* name : names) {
-            auto* filter = new Named(name[0] == '+' ? name + 1 : name);
-            filter->inPlace = name[0] == '+';
-            if (safe) filter->known.set("_safeToApplyAfter", 1);
-            addFilter(filter, -1);
+            add(name[0] == '+' ? name + 1 : name, -1).inPlace = name[0] == '+';
+            if (safe) at(nrFilters() - 1).known.set("_safeToApplyAfter", 1);
         }
         init();
+    }
+    FakeVideoFilter& add(const char* name, int place) {
+        auto* filter = new FakeVideoFilter;
+        filter->label = name;
+        addFilter(filter, place);
+        return *filter;
     }
     FakeVideoFilter& at(int i) { return static_cast<FakeVideoFilter&>(*filter(i)); }
     // The numbers of all frames that the pipe gives out for a decoder's.
@@ -36,9 +33,9 @@ struct Pipe : QvVf {
 
 TEST(VideoPipe, PositionsAndNames) {
     Pipe pipe({"a", "b"});
-    pipe.addFilter(new Named("c"), 0);
-    pipe.addFilter(new Named("d"), -5);
-    pipe.addFilter(new Named("a"), 99);
+    pipe.add("c", 0);
+    pipe.add("d", -5);
+    pipe.add("a", 99);
     ASSERT_EQ(pipe.nrFilters(), 5);
     const char* order[] = {"c", "a", "b", "d", "a"};
     for (int i = 0; i < 5; ++i) EXPECT_STREQ(pipe.filter(i)->name(), order[i]);
@@ -71,8 +68,7 @@ TEST(VideoPipe, EveryFrameLeavesOnceAndInPlaceFiltersSeeEach) {
     EXPECT_EQ(pipe.drain(decoder), (std::vector<int>{0, 0, 1, 1, 2, 2, 3, 3, 4, 4, 5, 5}));
     EXPECT_EQ(pipe.at(1).applied, (std::vector<int>{0, 1, 2, 3, 4, 5}));
     EXPECT_EQ(pipe.at(3).applied.size(), 12u);
-    EXPECT_EQ(pipe.framesIn(), 6u);
-    EXPECT_EQ(pipe.framesOut(), 12u);
+    EXPECT_TRUE(pipe.framesIn() == 6u && pipe.framesOut() == 12u);
 }
 
 TEST(VideoPipe, DropsAndRepeatsThroughSeveralGroupsAndReadsNoFurtherThanItMust) {

@@ -1,12 +1,10 @@
 #include "builtin/sinks/qvfilebuiltins.h"
 
 #include "tests/support/checks.h"
-#include "tests/support/temp_folder.h"
 
 namespace {
 
-class FileOutput : public testing::Test {
-  protected:
+struct FileOutput : testing::Test {
     FileOutput() {
         sink_.init();
         sink_.setParam("filename", Any(name_.c_str()));

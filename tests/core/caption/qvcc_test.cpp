@@ -1,14 +1,7 @@
 #include "core/caption/qvcc.h"
 
-#include <gtest/gtest.h>
-
-#include <string>
-#include <vector>
-
 #include "core/caption/cctext.h"
-#include "core/engine/qvexception.h"
-#include "core/value/any.h"
-#include "core/value/anycontainer.h"
+#include "tests/support/checks.h"
 
 namespace {
 

@@ -1,30 +1,35 @@
 #include "core/caption/qvsubtitlerender.h"
 
-#include <gtest/gtest.h>
-
 #include <algorithm>
 #include <climits>
 #include <functional>
 #include <set>
-#include <string>
-#include <vector>
 
 #include "core/arch/platform.h"
 #include "core/caption/qvsubtitles.h"
 #include "core/caption/qvtextrenderingoptions.h"
-#include "core/engine/init.h"
 #include "core/filter/qvcolorconvert.h"
 #include "core/media/qvbuffer.h"
 #include "core/media/qvdraw.h"
+#include "tests/support/checks.h"
+#include "tests/support/engine.h"
 #include "tests/support/pictures.h"
-#include "tests/support/temp_folder.h"
 
 namespace {
 
 constexpr unsigned ground = 0x808080;
+constexpr QvPoint standard(-1, -1);
 
-class Render : public testing::Test {
-  protected:
+QvSubtitle entry(const Any& text, QvPoint at = standard, const AnyVector& fieldMasks = {}, int rows = 1) {
+    QvSubtitle subtitle;
+    subtitle.text = text;
+    subtitle.position = at;
+    subtitle.fieldMasks = fieldMasks;
+    subtitle.rows = rows;
+    return subtitle;
+}
+
+struct Render : testing::Test {
     void SetUp() override {
         const std::string font = qv_platform().fontFile(QvFontFace::sans);
         if (font.empty()) GTEST_SKIP() << "no font on this system";
@@ -37,19 +42,15 @@ class Render : public testing::Test {
         frame.setBlack();
         frame.setRGB(0x80, 0x80, 0x80);
     }
-    void draw(const Any& text, int rows = 1, QvPoint at = {-1, -1}) {
-        QvSubtitle subtitle;
-        subtitle.text = text;
-        subtitle.rows = rows;
-        subtitle.position = at;
+    void draw(const QvSubtitle& subtitle) {
         QvSubtitleRender render;
         ASSERT_EQ(render.init(options), 0);
         ASSERT_EQ(render.render(frame, subtitle, nullptr), 0);
     }
     // The picture of a text on a fresh ground.
-    std::size_t picture(const Any& text, int rows = 1, QvPoint at = {-1, -1}) {
+    std::size_t picture(const Any& text, QvPoint at = standard) {
         clear(frame.width(), frame.height());
-        draw(text, rows, at);
+        draw(entry(text, at));
         return fingerprint();
     }
     std::size_t fingerprint() const { return std::hash<std::string>()(pictureBytes(frame)); }
@@ -74,7 +75,7 @@ class Render : public testing::Test {
 
 // Size 32: a line is 36 rows, two of them 73; half the size is 16. The letters of "H" stand on row 32.
 TEST_F(Render, LinesStandAboveTheLowerEdgeOrAtAPosition) {
-    draw("H|HHH", 2);
+    draw(entry("H|HHH", standard, {}, 2));
     const int first = 241 - 16 - 73;
     EXPECT_EQ(inked(0, first + 36).bottom(), first + 32);
     EXPECT_EQ(inked(first + 36).bottom(), first + 36 + 32);
@@ -83,7 +84,7 @@ TEST_F(Render, LinesStandAboveTheLowerEdgeOrAtAPosition) {
     EXPECT_NEAR(three.left() + three.right(), 640, 6);
     EXPECT_GT(three.width(), 2 * one.width());
 
-    picture("H", 1, {100, 20});
+    picture("H", {100, 20});
     EXPECT_EQ(inked().bottom(), 20 + 32);
     EXPECT_NEAR(inked().left(), 104, 4);
 }
@@ -98,13 +99,7 @@ TEST_F(Render, TagsChooseTheFaceAndAreNotDrawn) {
 }
 
 TEST_F(Render, FieldMasksLeaveOutLines) {
-    QvSubtitle subtitle;
-    subtitle.text = "HHHH";
-    subtitle.position = QvPoint(10, 10);
-    subtitle.fieldMasks = AnyVector(1, 2, 3);
-    QvSubtitleRender render;
-    render.init(options);
-    render.render(frame, subtitle, nullptr);
+    draw(entry("HHHH", {10, 10}, AnyVector(1, 2, 3)));
     const int expected[] = {2, 1, 0, 3};  // bit 0: on even rows, bit 1: on odd ones; no mask for the fourth
     const int advance = inked().right() - 10;
     for (int letter = 0; letter < 4; ++letter) {
@@ -120,7 +115,7 @@ TEST_F(Render, TheSameTextIsDrawnAnewWhereItDiffers) {
     QvSubtitleRender render;
     render.init(options);
     const QvColor red(0xFF0000);
-    const QvPoint standard(-1, -1), cut(630, 230);  // partly out of the picture
+    const QvPoint cut(630, 230);  // partly out of the picture
     const struct {
         const char* text;
         const QvColor* color;
@@ -132,12 +127,8 @@ TEST_F(Render, TheSameTextIsDrawnAnewWhereItDiffers) {
                 {"Still", nullptr, cut, {}},
                 {"Stills", nullptr, standard, {}}};
     const auto drawn = [&](const char* text, const QvColor* color, QvPoint at, const AnyVector& masks) {
-        QvSubtitle subtitle;
-        subtitle.text = text;
-        subtitle.position = at;
-        subtitle.fieldMasks = masks;
         clear(frame.width(), frame.height());
-        render.render(frame, subtitle, color);
+        render.render(frame, entry(text, at, masks), color);
         return fingerprint();
     };
     std::vector<std::size_t> first, again;
@@ -149,42 +140,38 @@ TEST_F(Render, TheSameTextIsDrawnAnewWhereItDiffers) {
 }
 
 TEST_F(Render, AnySizeOfTextAndPictureIsSurvived) {
-    draw(std::string(3000, 'W').c_str());
+    draw(entry(std::string(3000, 'W').c_str()));
     EXPECT_LE(inked().left(), 2);
     EXPECT_GE(inked().right(), 638);
-    std::string lines;
-    for (int i = 0; i < 5000; ++i) lines += "|x";
-    for (const int rows : {5001, INT_MAX, INT_MIN}) draw(lines.c_str(), rows);
+    for (const int rows : {5001, INT_MAX, INT_MIN})
+        draw(entry(repeated("|x", 5000).c_str(), standard, {}, rows));
     for (const int size : {1, 2, 3, 33}) {
         clear(size, size);
-        draw("Text|more", 2);
+        draw(entry("Text|more", standard, {}, 2));
     }
     for (const int size : {INT_MIN, -1, 0, 1, 1000, 4097, INT_MAX}) {
         options.charSize = size;
-        draw("H|\xC3\x89g");
+        draw(entry("H|\xC3\x89g"));
     }
 }
 
 // The letter stands in its place in every format, and its inside has exactly the colour that a whole picture
 // of it would have.
 TEST_F(Render, EveryFormatHasTheTextInItsPlaceAndColour) {
-    init_wrapper(nullptr);
+    const EngineScope engine;
     const QvColor orange(255, 128, 0, false);
     options.charSize = 200;
-    QvSubtitle subtitle;
-    subtitle.text = "H";
-    subtitle.position = QvPoint(100, 20);
+    const QvSubtitle subtitle = entry("H", {100, 20});
     QvSubtitleRender render;
     render.init(options);
-    for (const auto& [fourcc, height] :
-         {std::pair(QvFourcc::I420, 480), {QvFourcc::ARGB, 480}, {QvFourcc::I420, 480}}) {
-        clear(640, height);
+    for (const auto fourcc : {QvFourcc::I420, QvFourcc::ARGB, QvFourcc::I420}) {
+        clear(640, 480);
         render.render(frame, subtitle, &orange);
         const QvRect ink = inked();
         frame.setRGB(255, 128, 0);
         QvFrame whole, target;
         QvColorConverter(fourcc, false, false).convert(frame, whole);
-        target.init(fourcc, 640, height);
+        target.init(fourcc, 640, 480);
         target.setBlack();
         const QvFrame black(target);
         render.render(target, subtitle, &orange);
@@ -198,12 +185,11 @@ TEST_F(Render, EveryFormatHasTheTextInItsPlaceAndColour) {
                     if (byte != black.plane(plane)[at]) top = std::min(top, y), bottom = y + 1;
                 }
             const int step = frame.height() / target.height(plane);
-            EXPECT_GT(found, 500) << target.str_four_cc() << plane << " of " << height;
+            EXPECT_GT(found, 500) << target.str_four_cc() << plane;
             EXPECT_NEAR(top * step, ink.top(), 2) << target.str_four_cc() << plane;
             EXPECT_NEAR(bottom * step, ink.bottom(), 2) << target.str_four_cc() << plane;
         }
     }
-    cleanup_wrapper();
 }
 
 TEST(RenderWithoutFonts, SaysSoAndDrawsNothing) {
@@ -213,11 +199,9 @@ TEST(RenderWithoutFonts, SaysSoAndDrawsNothing) {
     options.fontBold = folder.write("bold.ttf", "this is no font").c_str();
     QvFrame frame = makePicture(QvFourcc::BGR4, 64, 64);
     const std::string before = pictureBytes(frame);
-    QvSubtitle subtitle;
-    subtitle.text = "a<b>b</b><i>c</i>";
     QvSubtitleRender render;
     EXPECT_EQ(render.init(options), 0);
-    EXPECT_EQ(render.render(frame, subtitle, nullptr), 0);
+    EXPECT_EQ(render.render(frame, entry("a<b>b</b><i>c</i>"), nullptr), 0);
     EXPECT_TRUE(pictureBytes(frame) == before);
 }
 

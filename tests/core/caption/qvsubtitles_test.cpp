@@ -1,12 +1,6 @@
 #include "core/caption/qvsubtitles.h"
 
-#include <gtest/gtest.h>
-
-#include <string>
-
-#include "tests/support/log_capture.h"
-#include "tests/support/platform_scope.h"
-#include "tests/support/temp_folder.h"
+#include "tests/support/checks.h"
 
 namespace {
 
@@ -14,8 +8,7 @@ using namespace std::string_literals;
 
 const QvFramerate pal{25.0};
 
-class Subtitles : public testing::Test {
-  protected:
+struct Subtitles : testing::Test {
     int parse(const char* name, const std::string& bytes) {
         return subtitles.parseFile(folder.write(name, bytes).c_str(), pal);
     }

@@ -1,9 +1,6 @@
 #include "core/caption/qvtext.h"
 
-#include <gtest/gtest.h>
-
-#include <string>
-#include <vector>
+#include "tests/support/checks.h"
 
 namespace {
 

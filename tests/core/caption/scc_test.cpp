@@ -1,21 +1,12 @@
 // SCC files, read and written.
-#include <gtest/gtest.h>
-
-#include <string>
-#include <vector>
-
 #include "core/caption/qvcc.h"
-#include "core/engine/qvexception.h"
-#include "core/value/any.h"
-#include "tests/support/log_capture.h"
-#include "tests/support/temp_folder.h"
+#include "tests/support/checks.h"
 
 namespace {
 
 constexpr char guessText[] = "Framerate guess could be inaccurate, not enough frames to be sure";
 
-class Scc : public testing::Test {
-  protected:
+struct Scc : testing::Test {
     int read(const std::string& lines, bool dropFrameLines = false) {
         return readFile(folder.write("a.scc", "Scenarist_SCC V1.0\n\n" + lines), dropFrameLines);
     }

@@ -1,18 +1,11 @@
-#include <gtest/gtest.h>
-
-#include <algorithm>
-#include <string>
-#include <vector>
 
 #include "core/arch/platform.h"
 #include "core/caption/textlayout_p.h"
 #include "core/caption/textmask_p.h"
 #include "core/media/qvframe.h"
-#include "core/value/any.h"
+#include "tests/support/checks.h"
 
 namespace {
-
-using Byte = unsigned char;
 
 // A font with the scripts that the tests need; not every system has one.
 std::string wideFont() {
@@ -24,8 +17,7 @@ std::string wideFont() {
     return "";
 }
 
-class Layout : public testing::Test {
-  protected:
+struct Layout : testing::Test {
     void SetUp() override {
         if (wideFont().empty()) GTEST_SKIP() << "no font with Arabic and Hebrew";
         for (FontFace& face : faces) face.load(library, wideFont().c_str(), 40);
@@ -74,7 +66,7 @@ TEST(TextMask, OutlinesOfOneDotAndOfMore) {
     const auto outlined = [](int radius) {
         QvFrame letters, mask;
         letters.init(QvFourcc::GRAY, 12, 10);
-        for (int y = 0; y < 10; ++y) std::fill_n(letters.pixelPtr(0, y), 12, Byte{});
+        letters.setBlack();
         *letters.pixelPtr(4, 4) = 0x81;
         *letters.pixelPtr(8, 4) = 0x42;
         *letters.pixelPtr(0, 9) = 0xFF;

@@ -157,7 +157,7 @@ TEST(QvBsSplitAudio, EachChannelIsAMonoFile) {
             std::string channel;
             for (size_t i = 0; i < 700; ++i) channel += samples.substr((i * 3 + c) * width, width);
             ASSERT_TRUE(file.substr(80) == channel) << bits << " bits, channel " << c;
-            EXPECT_EQ(leNumber(file, 22, 2), 1u);
+            EXPECT_TRUE(leNumber(file, 22, 2) == 1 && leNumber(file, 76, 4) == 700 * width);
             EXPECT_EQ(leNumber(file, 68, 4), 700u);
         }
         EXPECT_EQ(stream.ioError(), 0);

@@ -16,8 +16,7 @@ AnyDict source(const std::string& name, int size = 64) {
 }
 
 // A stream in a folder of its own; most tests write to "a.bin".
-class FileStream : public testing::Test {
-  protected:
+struct FileStream : testing::Test {
     bufstream* begin(const std::string& name = "a.bin", int size = 64) {
         EXPECT_EQ(stream.init(output(folder.file(name), size)), 0);
         return stream.input();

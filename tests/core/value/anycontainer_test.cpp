@@ -1,4 +1,3 @@
-#include "core/value/anycontainer.h"
 
 #include <algorithm>
 #include <limits>
