@@ -7,8 +7,9 @@
 #include <string>
 #include <vector>
 
+#include "builtin/pipes/encodepipe2.h"
 #include "core/decode/qvdecoder.h"
-#include "core/encode/qvencodepipe.h"
+#include "core/encode/qvmuxer.h"
 #include "core/engine/status.h"
 #include "core/media/qvbuffer.h"
 
@@ -17,23 +18,17 @@
 class FakeDecoder : public QvDecodePipe {
   public:
     FakeDecoder(int frames, const QvFramerate& rate, int width = 16, int height = 8) {
-        video.set("framerate", rate);
-        video.set("frames", frames);
-        video.set("width", width);
-        video.set("height", height);
-        video.set("FOURCC", static_cast<int>(QvFourcc::GRAY));
-        video.set("frameAspect", 1.0);
+        video = AnyDict("framerate", rate, "frames", frames, "width", width, "height", height, "FOURCC",
+                        static_cast<int>(QvFourcc::GRAY), "frameAspect", 1.0);
         setState(stateInitialised);
     }
     FakeDecoder& audio(long long samples, int samplerate, int channels = 2) {
-        AnyDict params("samplerate", samplerate, "channels", channels, "bitsPerSample", 16, "bytesPerSample",
-                       2, "codec", "PCM");
-        if (samples >= 0) params.set("samples", samples);
-        auto track = std::make_unique<Track>();
-        track->params = params;
-        track->total = samples >= 0 ? samples : (1LL << 40);
-        track->pcm.init(0, channels, 2, samplerate);
-        tracks.push_back(std::move(track));
+        auto& track = *tracks.emplace_back(std::make_unique<Track>());
+        track.params = AnyDict("samplerate", samplerate, "channels", channels, "bitsPerSample", 16,
+                               "bytesPerSample", 2, "codec", "PCM");
+        if (samples >= 0) track.params.set("samples", samples);
+        track.total = samples >= 0 ? samples : (1LL << 40);
+        track.pcm.init(0, channels, 2, samplerate);
         return *this;
     }
 
@@ -41,7 +36,7 @@ class FakeDecoder : public QvDecodePipe {
         return type == 1 ? 1 : type == 2 ? static_cast<int>(tracks.size()) : 0;
     }
     void getStreamParams(int type, int stream, AnyDict& out) const override {
-        out = type == 1 ? video : tracks.at(static_cast<std::size_t>(stream))->params;
+        out = type == 1 ? video : track(stream).params;
     }
     void getParam(const char* name, Any& value) const override {
         if (extra.isSet(name))
@@ -59,7 +54,7 @@ class FakeDecoder : public QvDecodePipe {
         return 0;
     }
     int seekToSample(long long sample, int stream) override {
-        tracks.at(static_cast<std::size_t>(stream))->position = sample;
+        track(stream).position = sample;
         return 0;
     }
     int readFrame(int) override {
@@ -74,26 +69,23 @@ class FakeDecoder : public QvDecodePipe {
         return 0;
     }
     int readSamples(int count, int stream) override {
-        auto& track = *tracks.at(static_cast<std::size_t>(stream));
+        auto& [params, total, position, pcm] = track(stream);
         requests.push_back(count);
-        const int n = static_cast<int>(std::min<long long>(count, track.total - track.position));
-        track.pcm.setSamples(0);
+        const int n = static_cast<int>(std::min<long long>(count, total - position));
+        pcm.setSamples(0);
         if (n < 1) return QvStatus::endOfStream;
-        if (track.pcm.size() < n) track.pcm.init(n, track.pcm.channels(), 2, track.pcm.samplerate());
-        track.pcm.setSamples(n);
-        auto* value = reinterpret_cast<short*>(track.pcm.ptr(0));
-        for (int i = 0; i < n; ++i)
-            for (int c = 0; c < track.pcm.channels(); ++c)
-                *value++ = static_cast<short>((track.position + i) % 1000 + 1);
-        track.position += n;
+        if (pcm.size() < n) pcm.init(n, pcm.channels(), 2, pcm.samplerate());
+        pcm.setSamples(n);
+        auto* value = reinterpret_cast<short*>(pcm.ptr(0));
+        for (int i = 0; i < n * pcm.channels(); ++i)
+            *value++ = static_cast<short>((position + i / pcm.channels()) % 1000 + 1);
+        position += n;
         return n;
     }
     int nrFrames(int) const override { return video.getInt32("frames"); }
-    long long nrSamples(int stream) const override {
-        return tracks.at(static_cast<std::size_t>(stream))->total;
-    }
+    long long nrSamples(int stream) const override { return track(stream).total; }
     QvFrame* getFramePtr(int) override { return &frame; }
-    QvPcm* getAudioPtr(int stream) override { return &tracks.at(static_cast<std::size_t>(stream))->pcm; }
+    QvPcm* getAudioPtr(int stream) override { return &track(stream).pcm; }
     int select(int, int) override { return 0; }
     int deselect(int, int) override { return 0; }
     int selected(AnyDict&) const override { return 0; }
@@ -105,6 +97,7 @@ class FakeDecoder : public QvDecodePipe {
         long long position = 0;
         QvPcm pcm;
     };
+    Track& track(int stream) const { return *tracks.at(static_cast<std::size_t>(stream)); }
     int available() const { return truncatedAt >= 0 ? truncatedAt : video.getInt32("frames"); }
 
     AnyDict video;
@@ -162,11 +155,9 @@ class FakeAudioEncoder : public FakeEncoder<QvAudioEncoder> {
         counts.push_back(count);
         total += count;
         addresses.push_back(pcm);
-        if (!pcm) return result;
-        for (int i = 0; i < count; ++i) {
+        for (int i = 0; pcm && i < count; ++i) {
             short value = 0;
-            std::memcpy(&value, pcm->ptr(i),
-                        std::min<std::size_t>(sizeof value, static_cast<std::size_t>(pcm->bytesPerSample())));
+            std::memcpy(&value, pcm->ptr(i), pcm->bytesPerSample() < 2 ? 1 : 2);
             values.push_back(value);
         }
         return result;
@@ -179,20 +170,16 @@ class FakeAudioEncoder : public FakeEncoder<QvAudioEncoder> {
 };
 
 // One video and any number of audio encoders, without multiplexer and sink.
-class FakeEncodePipe : public QvEncodePipe {
+class FakeEncodePipe : public EncodePipe2 {
   public:
     FakeEncodePipe(const QvFramerate& rate, int width = 16, int height = 8) {
-        video.params.set("framerate", rate);
-        video.params.set("width", width);
-        video.params.set("height", height);
-        video.params.set("inFOURCC", AnyVector(Any(static_cast<int>(QvFourcc::GRAY))));
+        video.params = AnyDict("framerate", rate, "width", width, "height", height, "inFOURCC",
+                               AnyVector(Any(static_cast<int>(QvFourcc::GRAY))));
     }
     FakeEncodePipe& audio(int samplerate, int channels = 2, int bits = 16) {
         audios.push_back(std::make_unique<FakeAudioEncoder>());
-        auto& params = audios.back()->params;
-        params.set("samplerate", samplerate);
-        params.set("channels", channels);
-        params.set("bitsPerSample", bits);
+        audios.back()->params =
+            AnyDict("samplerate", samplerate, "channels", channels, "bitsPerSample", bits);
         return *this;
     }
 
@@ -204,62 +191,55 @@ class FakeEncodePipe : public QvEncodePipe {
         const std::string full = name;
         const auto slash = full.find('/');
         if (slash == std::string::npos) return;
-        const QvCodec* target = &video;
-        if (full[0] == 'a') target = audios.at(static_cast<std::size_t>(full[5] - '0')).get();
-        target->getParam(full.c_str() + slash + 1, value);
+        encoder(full[0] == 'a' ? 2 : 1, full[5] - '0')->getParam(full.c_str() + slash + 1, value);
     }
     int open() override { return 0; }
     int close() override { return 0; }
     int abort() override { return 0; }
     int writeFrame(QvFrame* frame, int) override { return video.writeFrame(frame); }
     int writePcm(QvPcm* pcm, int stream) override { return audioEncoder(stream)->writePcm(pcm); }
-    int applyPreset(const QvPreset&, int) override { return -1; }
-    int applyPreset(int, int) override { return -1; }
-    void storePreset(AnyDict&) const override {}
-    const QvPreset* activePreset() const override { return nullptr; }
     int nrStreams(int mask) const override {
-        return (mask & 1 ? videoStreams : 0) + (mask & 2 ? static_cast<int>(audios.size()) : 0);
+        return (mask & 1 ? 1 : 0) + (mask & 2 ? static_cast<int>(audios.size()) : 0);
     }
     QvOStream* stream(int type, int nr) const override {
-        return nr < 0 || nr >= nrStreams(type) ? nullptr : streamAt(type == 1 ? nr : videoStreams + nr);
+        return nr < 0 || nr >= nrStreams(type) ? nullptr : streamAt(type == 1 ? nr : 1 + nr);
     }
     QvOStream* streamAt(int index) const override {
-        while (static_cast<int>(records.size()) <= index) {
-            const bool isVideo = static_cast<int>(records.size()) < videoStreams;
-            records.push_back(std::make_unique<QvOStream>(isVideo ? 1 : 2));
-        }
+        while (static_cast<int>(records.size()) <= index)
+            records.push_back(std::make_unique<QvOStream>(records.empty() ? 1 : 2));
         return records.at(static_cast<std::size_t>(index)).get();
     }
-    TPtrList<QvOStream> streams(int) const override { return {}; }
-    int indexOf(QvOStream*) const override { return -1; }
-    int streamNr(QvOStream*) const override { return -1; }
-    int addStream(int, const Any&) override { return -1; }
-    void removeStream(QvOStream*) override {}
-    void removeStream(int, int) override {}
-    void removeStreams(int) override {}
-    int setCodec(int, int, const char*, const AnyDict&) override { return -1; }
     QvEncoder* encoder(int type, int nr) const override {
         if (type == 1) return videoEncoder(nr);
         return audioEncoder(nr);
     }
-    QvEncoder* encoder(int) const override { return nullptr; }
     QvVideoEncoder* videoEncoder(int) const override { return const_cast<FakeVideoEncoder*>(&video); }
     QvAudioEncoder* audioEncoder(int nr) const override {
         return audios.at(static_cast<std::size_t>(nr)).get();
     }
-    int setMuxer(const char*) override { return -1; }
     QvMuxer* getMuxer() const override { return muxer; }
-    void setCreateOutFolder(bool) override {}
-    bool createOutFolder() const override { return false; }
-    int setSink(const char*) override { return -1; }
-    QvSink* sink() const override { return nullptr; }
 
     FakeVideoEncoder video;
     std::vector<std::unique_ptr<FakeAudioEncoder>> audios;
     AnyDict set;
     QvMuxer* muxer = nullptr;
-    int videoStreams = 1;
 
   private:
     mutable std::vector<std::unique_ptr<QvOStream>> records;
+};
+
+// Takes every parameter, answers with what it was given, and has at most one video stream.
+class FakeMuxer : public FakeEncoder<QvMuxer> {
+  public:
+    explicit FakeMuxer(const char* name, QvBufStream* video = nullptr) : name_(name), video_(video) {}
+    const char* name() const override { return name_; }
+    QvBufStream* addStream(int, const AnyDict&) override { return nullptr; }
+    void removeStreams(int) override {}
+    void removeStream(int, int) override {}
+    int nrStreams(int type) const override { return type == 1 && video_ ? 1 : 0; }
+    QvBufStream* stream(int, int) const override { return video_; }
+
+  private:
+    const char* name_;
+    QvBufStream* video_;
 };

@@ -7,7 +7,7 @@
 #include "core/media/qvgeometry.h"
 #include "core/stream/auxinfoid.h"
 #include "tests/support/checks.h"
-#include "tests/support/fake_muxer.h"
+#include "tests/support/fake_streams.h"
 #include "tests/support/pictures.h"
 #include "tests/support/test_stream.h"
 

@@ -11,7 +11,6 @@
 #include "core/transcode/qvtranscoder.h"
 #include "core/transcode/qvtranscodetask.h"
 #include "tests/support/checks.h"
-#include "tests/support/fake_muxer.h"
 #include "tests/support/fake_streams.h"
 #include "tests/support/log_capture.h"
 
