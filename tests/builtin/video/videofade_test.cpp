@@ -17,12 +17,6 @@ std::vector<int> levels(Opened& fade, int frames) {
     return found;
 }
 
-// A sample that is read as 8 bits, whatever the format: plane, byte of the row.
-struct Sample {
-    unsigned fourcc;
-    int plane, byte, black;
-};
-
 }  // namespace
 
 TEST(CVideoFade, RampsAreLinearAndMeetBlackAtTheEnds) {
@@ -68,7 +62,11 @@ TEST(CVideoFade, EveryFormatFadesToItsBlackAndKeepsAlpha) {
     }
     QvFrame clear = makePicture(QvFourcc::BGRA, 4, 2);
     EXPECT_EQ(Opened({{"fade_in", 1}}).through(clear).plane()[7], clear.plane()[7]);
-    const Sample samples[] = {
+    // Read as 8 bits, whatever the format.
+    const struct {
+        unsigned fourcc;
+        int plane, byte, black;
+    } samples[] = {
         {QvFourcc::I420, 2, 0, 128}, {QvFourcc::YUYV, 0, 3, 128}, {QvFourcc::UYVY, 0, 1, 16},
         {QvFourcc::Y216, 0, 3, 128}, {QvFourcc::R32C, 0, 1, 16},  {QvFourcc::b64a, 0, 3, 0},
         {QvFourcc::v210, 0, 3, 32},  {QvFourcc::R565, 0, 1, 0},   {QvFourcc::I422, 2, 1, 128},
