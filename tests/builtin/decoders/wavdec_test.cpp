@@ -2,7 +2,6 @@
 
 #include "tests/support/checks.h"
 #include "tests/support/pictures.h"
-#include "tests/support/temp_folder.h"
 #include "tests/support/wav_bytes.h"
 
 namespace {

@@ -2,16 +2,12 @@
 #include "builtin/decoders/sccdec.h"
 #include "core/caption/qvcc.h"
 #include "core/filter/filtersstate.h"
-#include "core/filter/jobdescription.h"
 #include "core/filter/qvfiltersetup.h"
-#include "core/filter/qvprocesspipe.h"
-#include "core/filter/qvprocessutil.h"
 #include "core/filter/userdatacallback.h"
 #include "core/transcode/qvtranscodetask.h"
 #include "core/transcode/translink.h"
 #include "tests/core/filter/chains.h"
 #include "tests/support/engine.h"
-#include "tests/support/temp_folder.h"
 
 namespace {
 

@@ -1,8 +1,6 @@
 // What the tests of video effects share.
 #pragma once
 
-#include <gtest/gtest.h>
-
 #include <algorithm>
 #include <cstring>
 #include <initializer_list>
@@ -12,7 +10,7 @@
 #include <vector>
 
 #include "builtin/video/samplelayout.h"
-#include "core/value/any.h"
+#include "tests/support/checks.h"
 #include "tests/support/pictures.h"
 
 using Params = std::vector<std::pair<const char*, Any>>;

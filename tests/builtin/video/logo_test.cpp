@@ -6,10 +6,8 @@
 #include "builtin/video/animatedlogo.h"
 #include "builtin/video/qvlogo.h"
 #include "core/filter/qvcolorconvert.h"
-#include "core/value/anycontainer.h"
 #include "tests/builtin/video/effect_frames.h"
 #include "tests/support/engine.h"
-#include "tests/support/temp_folder.h"
 
 namespace {
 

@@ -4,7 +4,6 @@
 
 #include "core/caption/qvsubtitlefilter.h"
 #include "core/engine/qvcodec.h"
-#include "core/engine/qvexception.h"
 #include "core/engine/qvmodule.h"
 #include "core/engine/qvplugin.h"
 #include "core/engine/qvregistry.h"

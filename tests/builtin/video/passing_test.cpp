@@ -2,9 +2,6 @@
 #include "builtin/video/dumpraw.h"
 #include "builtin/video/userdata.h"
 #include "tests/builtin/video/effect_frames.h"
-#include "tests/support/log_capture.h"
-#include "tests/support/platform_scope.h"
-#include "tests/support/temp_folder.h"
 
 namespace {
 

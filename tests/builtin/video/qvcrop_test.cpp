@@ -4,7 +4,6 @@
 #include <climits>
 
 #include "core/media/rect.h"
-#include "core/value/anycontainer.h"
 #include "tests/builtin/video/effect_frames.h"
 
 namespace {

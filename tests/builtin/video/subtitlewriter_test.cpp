@@ -4,8 +4,6 @@
 #include "core/media/qvgeometry.h"
 #include "tests/builtin/video/effect_frames.h"
 #include "tests/support/engine.h"
-#include "tests/support/log_capture.h"
-#include "tests/support/temp_folder.h"
 
 namespace {
 

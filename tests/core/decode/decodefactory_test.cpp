@@ -6,8 +6,6 @@
 #include "tests/core/decode/fake_decoder.h"
 #include "tests/support/checks.h"
 #include "tests/support/engine.h"
-#include "tests/support/log_capture.h"
-#include "tests/support/temp_folder.h"
 
 namespace {
 

@@ -2,7 +2,6 @@
 
 #include "tests/core/decode/fake_decoder.h"
 #include "tests/support/checks.h"
-#include "tests/support/log_capture.h"
 
 namespace {
 

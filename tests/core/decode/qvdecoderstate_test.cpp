@@ -7,7 +7,6 @@
 #include <set>
 
 #include "tests/support/checks.h"
-#include "tests/support/temp_folder.h"
 #include "tests/support/wav_bytes.h"
 
 namespace {

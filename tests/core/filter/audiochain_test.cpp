@@ -1,11 +1,6 @@
 // The plan of the automatic audio chain.
 #include <cmath>
 
-#include "builtin/modules.h"
-#include "core/filter/jobdescription.h"
-#include "core/filter/qvprocesspipe.h"
-#include "core/filter/qvprocessutil.h"
-#include "core/media/qvgeometry.h"
 #include "tests/core/filter/chains.h"
 
 namespace {

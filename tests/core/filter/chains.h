@@ -4,10 +4,14 @@
 #include <memory>
 #include <string>
 
+#include "builtin/modules.h"
+#include "core/filter/jobdescription.h"
+#include "core/filter/qvprocesspipe.h"
+#include "core/filter/qvprocessutil.h"
+#include "core/media/qvgeometry.h"
 #include "tests/support/checks.h"
 #include "tests/support/fake_filters.h"
 #include "tests/support/fake_streams.h"
-#include "tests/support/log_capture.h"
 
 // The stored state of an active filter.
 inline AnyDict stored(const char* name, AnyDict state = {}) {

@@ -4,7 +4,6 @@
 #include "core/media/qvgeometry.h"
 #include "tests/support/checks.h"
 #include "tests/support/fake_filters.h"
-#include "tests/support/log_capture.h"
 
 namespace {
 

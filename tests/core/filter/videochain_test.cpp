@@ -1,9 +1,5 @@
 // The plan of the automatic video chain: which filters, in which order, with which parameters.
-#include "builtin/modules.h"
 #include "builtin/pipes/qvvideopipe.h"
-#include "core/filter/jobdescription.h"
-#include "core/filter/qvprocesspipe.h"
-#include "core/filter/qvprocessutil.h"
 #include "tests/core/filter/chains.h"
 
 namespace {

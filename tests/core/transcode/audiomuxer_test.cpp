@@ -2,7 +2,6 @@
 
 #include "tests/support/checks.h"
 #include "tests/support/fake_streams.h"
-#include "tests/support/log_capture.h"
 
 namespace {
 

@@ -1,7 +1,6 @@
 #include "core/engine/qvutil.h"
 #include "tests/support/checks.h"
 #include "tests/support/fake_streams.h"
-#include "tests/support/log_capture.h"
 
 namespace {
 

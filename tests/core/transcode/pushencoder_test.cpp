@@ -7,7 +7,6 @@
 #include "core/transcode/processparams.h"
 #include "tests/support/checks.h"
 #include "tests/support/failing_codecs.h"
-#include "tests/support/log_capture.h"
 #include "tests/support/output_pipe.h"
 
 namespace {

@@ -4,8 +4,6 @@
 #include "core/transcode/translink.h"
 #include "tests/core/transcode/transcode_fixture.h"
 #include "tests/support/fake_filters.h"
-#include "tests/support/platform_scope.h"
-#include "tests/support/temp_folder.h"
 
 namespace {
 

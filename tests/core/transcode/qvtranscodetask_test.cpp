@@ -3,7 +3,6 @@
 #include "tests/core/transcode/transcode_fixture.h"
 #include "tests/support/failing_codecs.h"
 #include "tests/support/fake_filters.h"
-#include "tests/support/temp_folder.h"
 #include "tests/support/wav_bytes.h"
 
 namespace {

@@ -12,7 +12,6 @@
 #include "core/transcode/qvtranscodetask.h"
 #include "tests/support/checks.h"
 #include "tests/support/fake_streams.h"
-#include "tests/support/log_capture.h"
 
 class Events {
   public:

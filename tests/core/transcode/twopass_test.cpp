@@ -1,6 +1,5 @@
 #include "tests/core/transcode/transcode_fixture.h"
 #include "tests/support/failing_codecs.h"
-#include "tests/support/temp_folder.h"
 
 namespace {
 
