@@ -10,7 +10,10 @@
 #include <vector>
 
 #include "builtin/video/samplelayout.h"
+#include "core/engine/qvregistry.h"
+#include "core/media/qvgeometry.h"
 #include "tests/support/checks.h"
+#include "tests/support/engine.h"
 #include "tests/support/pictures.h"
 
 using Params = std::vector<std::pair<const char*, Any>>;
@@ -30,6 +33,25 @@ struct OpenedEffect : Effect {
         EXPECT_EQ(this->write(frame), 0) << this->errorDesc();
         return this->ready() ? *this->frame() : nothing;
     }
+};
+
+// For effects that draw text.
+class TextEffect : public testing::Test {
+  protected:
+    void SetUp() override {
+        if (qv_registry()->defaultFontFile(0).isFalse()) GTEST_SKIP() << "no font on this system";
+    }
+    static QvFrame black(int width, int height, const QvFramerate& rate, int number,
+                         unsigned fourcc = QvFourcc::BGR4) {
+        QvFrame frame;
+        frame.init(fourcc, width, height);
+        frame.setBlack();
+        frame.framerate = rate;
+        frame.frameNr = number;
+        return frame;
+    }
+
+    EngineScope engine_;
 };
 
 inline std::string fourccName(unsigned fourcc) { return qvFourccText(fourcc).data(); }

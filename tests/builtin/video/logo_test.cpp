@@ -7,7 +7,6 @@
 #include "builtin/video/qvlogo.h"
 #include "core/filter/qvcolorconvert.h"
 #include "tests/builtin/video/effect_frames.h"
-#include "tests/support/engine.h"
 
 namespace {
 

@@ -6,11 +6,8 @@
 #include "core/engine/qvcodec.h"
 #include "core/engine/qvmodule.h"
 #include "core/engine/qvplugin.h"
-#include "core/engine/qvregistry.h"
 #include "core/filter/qvprocessutil.h"
-#include "core/media/qvgeometry.h"
 #include "tests/builtin/video/effect_frames.h"
-#include "tests/support/engine.h"
 
 namespace {
 

@@ -1,9 +1,6 @@
 #include "builtin/video/subtitlewriter.h"
 
-#include "core/engine/qvregistry.h"
-#include "core/media/qvgeometry.h"
 #include "tests/builtin/video/effect_frames.h"
-#include "tests/support/engine.h"
 
 namespace {
 
@@ -13,21 +10,10 @@ constexpr const char* srt =
     "2\n00:00:03,000 --> 00:00:04,000\n<i>two</i>\nlines\n\n"
     "3\n00:00:05,000 --> 00:00:06,000\n\xE9t\xE9\n\n";
 
-class Subtitle : public testing::Test {
+class Subtitle : public TextEffect {
   protected:
-    EngineScope engine_;
-    void SetUp() override {
-        if (qv_registry()->defaultFontFile(0).isFalse()) GTEST_SKIP() << "no font on this system";
-        file_ = folder_.write("talk.srt", srt);
-    }
-
-    static QvFrame blank(int number, const QvFramerate& rate = QvFramerate(QvRatio(25, 1))) {
-        QvFrame frame;
-        frame.init(QvFourcc::I420, 320, 240);
-        frame.setBlack();
-        frame.frameNr = number;
-        frame.framerate = rate;
-        return frame;
+    static QvFrame blank(int number, const QvFramerate& rate) {
+        return black(320, 240, rate, number, QvFourcc::I420);
     }
     std::string at(int number, Params params = {}, const QvFramerate& rate = QvFramerate(QvRatio(25, 1))) {
         QvFrame frame = blank(number, rate);
@@ -40,7 +26,7 @@ class Subtitle : public testing::Test {
     }
 
     TempFolder folder_;
-    std::string file_;
+    std::string file_ = folder_.write("talk.srt", srt);
 };
 
 TEST_F(Subtitle, IsShownAtItsTime) {

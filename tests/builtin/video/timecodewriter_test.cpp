@@ -4,12 +4,9 @@
 #include <tuple>
 
 #include "core/caption/qvtextrenderingoptions.h"
-#include "core/engine/qvregistry.h"
 #include "core/media/qvdraw.h"
-#include "core/media/qvgeometry.h"
 #include "tests/builtin/video/effect_frames.h"
 #include "tests/support/counted_memory.h"
-#include "tests/support/engine.h"
 
 namespace {
 
@@ -17,15 +14,6 @@ const QvFramerate pal(QvRatio(25, 1)), palFields(QvRatio(25, 1), 1), ntsc(QvRati
     drop(QvRatio(30000, 1001), 0, true);
 
 using Writer = OpenedEffect<TimecodeWriter>;
-
-QvFrame black(int width, int height, const QvFramerate& rate, int number, unsigned fourcc = QvFourcc::BGR4) {
-    QvFrame frame;
-    frame.init(fourcc, width, height);
-    frame.setBlack();
-    frame.framerate = rate;
-    frame.frameNr = number;
-    return frame;
-}
 
 std::string written(const Params& params, QvFrame frame) {
     Writer writer(params);
@@ -47,13 +35,7 @@ std::string drawn(const char* text, int size, QvPoint at, QvFrame frame, const Q
     return pictureBytes(frame);
 }
 
-class Timecode : public testing::Test {
-  protected:
-    EngineScope engine_;
-    void SetUp() override {
-        if (qv_registry()->defaultFontFile(0).isFalse()) GTEST_SKIP() << "no font on this system";
-    }
-};
+using Timecode = TextEffect;
 
 TEST_F(Timecode, CountsAsItsParametersSay) {
     const struct {
