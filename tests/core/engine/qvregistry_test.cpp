@@ -1,28 +1,15 @@
 #include "core/engine/qvregistry.h"
 
-#include <memory>
-
 #include "core/engine/init.h"
-#include "core/engine/qvcodec.h"
 #include "core/engine/qvfileutil.h"
-#include "core/engine/qvmodule.h"
-#include "core/engine/qvplugin.h"
 #include "tests/support/checks.h"
+#include "tests/support/fake_filters.h"
 
 namespace {
 
-class Empty : public QvCodec {
-  public:
-    int setParam(const char* name, const Any& value) override { return QvCodec::setParam(name, value); }
-    int open() override { return 0; }
-    int close() override { return 0; }
-    void* getInterface(int) const override { return nullptr; }
-};
-
 int alive = 0;
 
-class Unwilling : public Empty {
-  public:
+struct Unwilling : FakeVideoFilter {
     Unwilling() { ++alive; }
     ~Unwilling() override { --alive; }
     int init() override { return -1; }
@@ -44,13 +31,6 @@ class TestModule : public QvModule {
 template <class Codec>
 QvCodec* make() {
     return new Codec;
-}
-
-template <class... T>
-AnyVector exts(T... names) {
-    AnyVector list;
-    (list.append(names), ...);
-    return list;
 }
 
 // Registers nothing but its own plug-in, and leaves an empty registry.
@@ -112,7 +92,7 @@ TEST_F(Registry, EarlierPluginsHideLaterOnes) {
 }
 
 TEST_F(Registry, MakesCodecs) {
-    add(12, "good", AnyDict(), make<Empty>);
+    add(12, "good", AnyDict(), make<FakeVideoFilter>);
     add(12, "bad", AnyDict(), make<Unwilling>);
     add(12, "none");
     registry.addPlugin(&plugin);
@@ -125,19 +105,19 @@ TEST_F(Registry, MakesCodecs) {
 }
 
 TEST_F(Registry, DecodersComeBestFirst) {
-    add(2, "low", AnyDict("exts", exts("avi", "mov"), "priority", 20));
-    add(2, "any", AnyDict("exts", exts("*"), "priority", -95));  // 6 for every file
-    add(2, "late any", AnyDict("exts", exts("*")));              // 200
-    add(2, "named any", AnyDict("exts", exts("*", "mov"), "priority", 20));
-    add(2, "default", AnyDict("exts", exts("avi")));  // 99
-    add(2, "text", AnyDict("exts", exts("avi"), "priority", "1"));
-    add(2, "off", AnyDict("exts", exts("avi"), "priority", 1, "disabled", 1));
-    add(2, "oddly on", AnyDict("exts", exts("avi"), "priority", 30, "disabled", "yes"));
-    add(2, "skip", AnyDict("exts", exts("avi"), "priority", 1, "skipAuto", 1));
-    add(2, "never", AnyDict("exts", exts("avi"), "priority", 666));
-    add(2, "huge", AnyDict("exts", exts("*"), "priority", 2147483647));
+    add(2, "low", AnyDict("exts", AnyVector("avi", "mov"), "priority", 20));
+    add(2, "any", AnyDict("exts", AnyVector(Any("*")), "priority", -95));  // 6 for every file
+    add(2, "late any", AnyDict("exts", AnyVector(Any("*"))));              // 200
+    add(2, "named any", AnyDict("exts", AnyVector("*", "mov"), "priority", 20));
+    add(2, "default", AnyDict("exts", AnyVector(Any("avi"))));  // 99
+    add(2, "text", AnyDict("exts", AnyVector(Any("avi")), "priority", "1"));
+    add(2, "off", AnyDict("exts", AnyVector(Any("avi")), "priority", 1, "disabled", 1));
+    add(2, "oddly on", AnyDict("exts", AnyVector(Any("avi")), "priority", 30, "disabled", "yes"));
+    add(2, "skip", AnyDict("exts", AnyVector(Any("avi")), "priority", 1, "skipAuto", 1));
+    add(2, "never", AnyDict("exts", AnyVector(Any("avi")), "priority", 666));
+    add(2, "huge", AnyDict("exts", AnyVector(Any("*")), "priority", 2147483647));
     add(2, "none");
-    add(12, "filter", AnyDict("exts", exts("avi"), "priority", 1));
+    add(12, "filter", AnyDict("exts", AnyVector(Any("avi")), "priority", 1));
     registry.addPlugin(&plugin);
     EXPECT_EQ(decodersFor("avi"), "any, low, oddly on, default, text, named any, late any");
     EXPECT_EQ(decodersFor("mov"), "any, low, named any, late any");
