@@ -60,8 +60,7 @@ TEST_F(BadInput, NamesThatAreHardToHandle) {
           "\xFF\xFE", "#00", "a\\b", "tab\there", "*"}) {
         SCOPED_TRACE(name);
         makeWav(name + ".wav", 500);
-        const Outcome o = tarsel({"transcode", "-o", "./" + name + "_out.wav", "--", name + ".wav"});
-        EXPECT_EQ(o.status, 0) << o.err;
+        const Outcome o = works({"transcode", "-o", "./" + name + "_out.wav", "--", name + ".wav"});
         EXPECT_EQ(std::count(o.err.begin(), o.err.end(), '\n'), 1) << o.err;
         EXPECT_TRUE(wavPart(contents(name + ".wav"), "data") == wavPart(contents(name + "_out.wav"), "data"));
         EXPECT_EQ(tarsel({"info", "--json", "--", name + ".wav"}).status, 0);

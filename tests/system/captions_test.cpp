@@ -9,8 +9,7 @@ TEST_F(Captions, LinesOfBothFieldsInTheOrderOfTime) {
     const std::string header = "Scenarist_SCC V1.0\r\n\r\n";
     folder.write("a.scc", header + "01:00:00;29\t9420 9420 94d0 c8e9 a180 942f\r\n\r\n01:00:10;02\t942c\r\n");
     folder.write("b.scc", header + "01:00:05;01\t1520 d5ee 19b7\r\n");
-    const Outcome shown = tarsel({"captions", "a.scc", "b.scc"});
-    EXPECT_EQ(shown.status, 0) << shown.err;
+    const Outcome shown = works({"captions", "a.scc", "b.scc"});
     EXPECT_EQ(shown.err, "");
     EXPECT_EQ(shown.out,
               "01:00:00;29\t1\t9420 9420 94d0 c8e9 a180 942f\tHi!\n"
@@ -51,8 +50,7 @@ TEST_F(Captions, InfoTellsWhatATextFileHolds) {
 TEST_F(Captions, WhatHasNoneOrHoldsNoneIsTold) {
     folder.write("text.srt", "1\n00:00:01,000 --> 00:00:02,000\nHi\n");
     const Outcome ran =
-        tarsel({"transcode", "testgen:size=64x64,duration=1f,audio=0", "text.srt", "-o", "a.yuv"});
-    EXPECT_EQ(ran.status, 0) << ran.err;
+        works({"transcode", "testgen:size=64x64,duration=1f,audio=0", "text.srt", "-o", "a.yuv"});
     EXPECT_THAT(ran.err, testing::HasSubstr("nothing of 'text.srt' goes into the output"));
     folder.write("text.scc", "1\n00:00:01,000 --> 00:00:02,000\nHi\n");
     folder.write("none.scc", "Scenarist_SCC V1.0\n");

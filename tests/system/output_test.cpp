@@ -89,8 +89,7 @@ TEST_F(Output, AFullDeviceIsTold) {
 
 TEST_F(Output, ADeviceOrAPipeTakesOneStream) {
     works({"transcode", "in.wav", "-o", "/dev/null"});
-    const Outcome o = tarsel({"transcode", kCard, "-o", "/dev/stdout"});
-    EXPECT_EQ(o.status, 0) << o.err;
+    const Outcome o = works({"transcode", kCard, "-o", "/dev/stdout"});
     EXPECT_EQ(o.out.size(), 25u * 64 * 64 * 4);
     mkfifo(folder.file("pipe.raw").c_str(), 0600);
     Process reader({"sh", "-c", "cat '" + folder.file("pipe.raw") + "' > '" + folder.file("copy.raw") + "'"});

@@ -7,9 +7,7 @@ class Picture : public Tool {};
 
 // Four seconds at 29.97 hold 119 whole frames, and these last 175104 samples at 44100 Hz.
 TEST_F(Picture, GeneratedFramesAndTheirSamples) {
-    const Outcome o =
-        tarsel({"transcode", "testgen:size=96x64,rate=30000/1001,duration=4", "-o", "card.raw"});
-    ASSERT_EQ(o.status, 0) << o.err;
+    const Outcome o = works({"transcode", "testgen:size=96x64,rate=30000/1001,duration=4", "-o", "card.raw"});
     EXPECT_EQ(o.err, "tarsel: wrote 'card.raw' and 'card.wav', 119 frames, 175104 samples\n");
     EXPECT_EQ(listing(), (std::set<std::string>{"card.raw", "card.wav"}));
     EXPECT_EQ(size("card.raw"), 119 * 96 * 64 * 4);
@@ -49,8 +47,7 @@ TEST_F(Picture, FramesBetweenPointsAreThoseOfTheInput) {
         SCOPED_TRACE(testing::PrintToString(c.points));
         std::vector<std::string> job = asYuv({"transcode", "clip.yuv", "-o", "part.yuv", "-y"});
         job.insert(job.end(), c.points.begin(), c.points.end());
-        const Outcome o = tarsel(job);
-        ASSERT_EQ(o.status, 0) << o.err;
+        const Outcome o = works(job);
         EXPECT_TRUE(clip.substr(c.first * kFrame, c.count * kFrame) == contents("part.yuv"));
         EXPECT_THAT(o.err, testing::HasSubstr(", " + std::to_string(c.count) + " frame"));
     }

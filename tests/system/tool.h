@@ -36,9 +36,10 @@ class Tool : public testing::Test {
     }
 
     // A run that must do its work.
-    void works(const std::vector<std::string>& arguments) const {
-        const Outcome o = tarsel(arguments);
+    Outcome works(const std::vector<std::string>& arguments) const {
+        Outcome o = tarsel(arguments);
         EXPECT_EQ(o.status, 0) << o.err << testing::PrintToString(arguments);
+        return o;
     }
 
     // A run that must fail with this status and one line with all of `parts`, and leave the folder as it was.
