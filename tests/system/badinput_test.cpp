@@ -18,7 +18,7 @@ TEST_F(BadInput, OneLineAndTheRightStatus) {
     mkfifo(folder.file("fifo.wav").c_str(), 0600);
     const struct {
         const char* file;
-        std::vector<std::string> parts;
+        Words parts;
     } cases[] = {
         {"absent.wav", {"no such file"}},
         {"empty.wav/below.wav", {"can't open"}},
@@ -32,8 +32,7 @@ TEST_F(BadInput, OneLineAndTheRightStatus) {
         {"clip.yuv", {"--raw"}},
     };
     for (const auto& c : cases) {
-        std::vector<std::string> parts = c.parts;
-        parts.push_back("'" + std::string(c.file) + "'");
+        const Words parts = c.parts + Words{"'" + std::string(c.file) + "'"};
         fails(3, {"transcode", c.file, "-o", "out.wav"}, parts);
         fails(3, {"info", c.file}, parts);
         fails(3, {"frame", c.file, "-o", "out.png"}, parts);

@@ -16,8 +16,8 @@ class Command : public Tool {
 TEST_F(Command, WrongUseIsTold) {
     const struct {
         int status;
-        std::vector<std::string> words;
-        std::vector<std::string> parts;
+        Words words;
+        Words parts;
     } cases[] = {
         {2, {}, {"tarsel --help"}},
         {2, {"transcoed"}, {"'transcoed'", "Did you mean 'transcode'?"}},
@@ -27,12 +27,10 @@ TEST_F(Command, WrongUseIsTold) {
         {5, {"transcode", "in.wav", "--filter", "qqqqqq", "-o", "x.wav"}, {"'qqqqqq'", "tarsel modules"}},
         {2, {"transcode", "testgen:sizee=64x64", "-o", "x.raw"}, {"'sizee'", "Did you mean 'size'?"}},
         {2, {"transcode", "testgen:size=10x10", "-o", "x.raw"}, {"32x32"}},
+        {2, {"transcode", "testgen", "--pixel", "I42O", "-o", "x.raw"}, {"'I42O'", "Did you mean 'I420'"}},
         {2,
-         {"transcode", "testgen:size=64x64", "--pixel", "I42O", "-o", "x.raw"},
-         {"--pixel", "'I42O'", "Did you mean 'I420'"}},
-        {2,
-         {"transcode", "testgen", "--filter", "scaler:outWidht=3", "-o", "x.raw"},
-         {"'outWidht'", "no parameter"}},
+         {"transcode", "testgen", "--filter", "flipper:flop=3", "-o", "x.raw"},
+         {"'flop'", "no parameter"}},
     };
     for (const auto& c : cases) fails(c.status, c.words, c.parts);
 }
@@ -76,11 +74,11 @@ TEST_F(Command, InfoTellsWhatIsThere) {
 }
 
 TEST_F(Command, AStandardOutputThatTakesNothing) {
-    for (const std::vector<std::string>& job : {std::vector<std::string>{"info", "in.wav", "--json"},
-                                                {"modules"},
-                                                {"formats", "--json"},
-                                                {"--help"},
-                                                {"transcode", "in.wav", "-o", "x.wav", "--dry-run"}}) {
+    for (const Words& job : {Words{"info", "in.wav", "--json"},
+                             {"modules"},
+                             {"formats", "--json"},
+                             {"--help"},
+                             {"transcode", "in.wav", "-o", "x.wav", "--dry-run"}}) {
         ProcessOptions full = here();
         full.outputTo = "/dev/full";
         failsAs(4, tarsel(job, full), {"standard output", "No space left on device"}, job[0]);

@@ -4,15 +4,8 @@
 namespace {
 
 using testing::HasSubstr;
-using Words = std::vector<std::string>;
-
-Words operator+(Words a, const Words& b) {
-    a.insert(a.end(), b.begin(), b.end());
-    return a;
-}
-
 struct Box {
-    int x, y, width, height;
+    size_t x, y, width, height;
 };
 
 class Effects : public Tool {
@@ -21,15 +14,13 @@ class Effects : public Tool {
     static std::string part(const std::string& frame, const Box& box, bool flip = false) {
         std::string cut;
         size_t plane = 0;
-        for (const int scale : {1, 2, 2}) {
-            const size_t stride = 64u / static_cast<unsigned>(scale);
-            for (int row = 0; row < box.height / scale; ++row) {
-                const int y = box.y / scale + (flip ? box.height / scale - 1 - row : row);
-                cut +=
-                    frame.substr(plane + static_cast<size_t>(y) * stride + static_cast<size_t>(box.x / scale),
-                                 static_cast<size_t>(box.width / scale));
+        for (const size_t scale : {1u, 2u, 2u}) {
+            const size_t stride = 64 / scale, rows = box.height / scale;
+            for (size_t row = 0; row < rows; ++row) {
+                const size_t y = box.y / scale + (flip ? rows - 1 - row : row);
+                cut += frame.substr(plane + y * stride + box.x / scale, box.width / scale);
             }
-            plane += stride * 48 / static_cast<unsigned>(scale);
+            plane += stride * 48 / scale;
         }
         return cut;
     }
@@ -62,7 +53,7 @@ TEST_F(Effects, TheCropKeepsItsPart) {
         {"16:9", {0, 6, 64, 36}},
     };
     for (const auto& c : cases) {
-        const size_t bytes = static_cast<size_t>(c.box.width * c.box.height * 3 / 2);
+        const size_t bytes = c.box.width * c.box.height * 3 / 2;
         const std::string cut = result({std::string("--crop=") + c.text});
         EXPECT_EQ(cut.size(), 2 * bytes) << c.text;
         EXPECT_TRUE(cut.substr(0, bytes) == part(first, c.box)) << c.text;
@@ -101,7 +92,7 @@ TEST_F(Effects, AFrameShowsWhatARunWrites) {
 
 TEST_F(Effects, FieldsBecomeFrames) {
     const Words job = {"transcode", "testgen:size=64x48,rate=25i,duration=1,audio=0", "-y", "-o", "x.raw"};
-    std::vector<std::string> all;
+    Words all;
     for (const char* method : {"", "=top", "=bottom", "=bob", "=double", "=reverse"}) {
         const Outcome o = tarsel(job + Words{std::string("--deinterlace") + method});
         EXPECT_THAT(o.err, HasSubstr(method == std::string("=double") ? ", 50 frames" : ", 25 frames"));
@@ -189,7 +180,7 @@ TEST_F(Effects, AFilterThatFailsFailsTheJob) {
     const struct {
         int status;
         Words options;
-        std::vector<std::string> parts;
+        Words parts;
     } cases[] = {
         {4, {"--filter", "rawdump:filename=/dev/full", "-o", "x.avi"}, {"rawdump", "/dev/full"}},
         {4, {"--filter", "rawdump:filename=/dev/full", "--muxer", "nullmux"}, {"rawdump", "/dev/full"}},
@@ -199,9 +190,7 @@ TEST_F(Effects, AFilterThatFailsFailsTheJob) {
         {4, {"--filter", "rawdump:filename=x.avi", "-o", "x.avi"}, {"'x.avi'", "output"}},
         {4, {"--filter", "logo:filename=l.png", "-o", "l.png", "-y"}, {"'l.png'", "input"}},
         {1, toI422 + Words{"--filter", "timecode:_front=1", "-o", "x.raw"}, {"timecode", "I422"}},
-        {1,
-         toI422 + Words{"--filter", "brightness:gamma=2,_front=1", "-o", "x.raw"},
-         {"unknown colorspace in brightness filter"}},
+        {1, toI422 + Words{"--filter", "brightness:gamma=2,_front=1", "-o", "x.raw"}, {"unknown colorspace"}},
     };
     for (const auto& c : cases) fails(c.status, job + c.options, c.parts);
     makeYuv("clip.yuv", 2);

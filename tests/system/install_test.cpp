@@ -40,13 +40,10 @@ class Installed : public Tool {
             runProgram({"cmake", "--install", QV_BINARY_DIR, "--prefix", folder.file("tree")}, here());
         EXPECT_EQ(o.status, 0) << o.err;
     }
-    static std::vector<std::string> flags() {
-        return *QV_SANITIZE ? std::vector<std::string>{"-fsanitize=" QV_SANITIZE}
-                            : std::vector<std::string>();
-    }
+    static Words flags() { return *QV_SANITIZE ? Words{"-fsanitize=" QV_SANITIZE} : Words(); }
     std::string configure(const std::string& source, const std::string& build,
                           const std::string& more) const {
-        std::vector<std::string> words{"cmake", "-GNinja", "-S", source, "-B", folder.file(build), more};
+        Words words{"cmake", "-GNinja", "-S", source, "-B", folder.file(build), more};
         words.push_back("-DCMAKE_PREFIX_PATH=" + folder.file("tree"));
         words.push_back("-DCMAKE_CXX_COMPILER=" QV_COMPILER);
         for (const auto& flag : flags()) words.push_back("-DCMAKE_CXX_FLAGS=" + flag);

@@ -32,9 +32,8 @@ TEST_F(Output, IsNeverAnInput) {
     fs::create_hard_link(folder.file("in.wav"), folder.file("hard.wav"));
     fs::create_symlink("in.wav", folder.file("soft.wav"));
     const std::string before = contents("in.wav");
-    for (const std::string& name :
-         std::vector<std::string>{"in.wav", "./in.wav", "hard.wav", "soft.wav",
-                                  "../" + folder.path().filename().string() + "/in.wav"})
+    for (const std::string& name : Words{"in.wav", "./in.wav", "hard.wav", "soft.wav",
+                                         "../" + folder.path().filename().string() + "/in.wav"})
         fails(4, {"transcode", "in.wav", "-o", name, "-y"}, {"'" + name + "'", "also an input"});
     fails(4, {"transcode", "in.wav", "-o", "t.wav", "--save-task", "in.wav", "-y"},
           {"'in.wav'", "also an input"});
@@ -44,8 +43,8 @@ TEST_F(Output, IsNeverAnInput) {
 TEST_F(Output, PlacesThatTakeNone) {
     fs::create_directory(folder.file("sub.wav"));
     const struct {
-        std::vector<std::string> job;
-        std::vector<std::string> parts;
+        Words job;
+        Words parts;
     } cases[] = {
         {{"transcode", "in.wav", "-o", "no/out.wav"}, {"'no/out.wav'", "folder 'no' does not exist"}},
         {{"transcode", "in.wav", "-o", "in.wav/out.wav"}, {"'in.wav/out.wav'", "'in.wav' is no folder"}},
@@ -71,7 +70,7 @@ TEST_F(Output, AWriteThatFailsLeavesNothing) {
     makeYuv("clip.yuv", 50);
     makeWav("long.wav", 100000);
     const auto before = listing();
-    for (const auto& job : {std::vector<std::string>{"transcode", "long.wav", "-o", "out.wav"},
+    for (const auto& job : {Words{"transcode", "long.wav", "-o", "out.wav"},
                             asYuv({"transcode", "clip.yuv", "-o", "out.yuv"})}) {
         failsAs(4, tarsel(job, limited), {"'out.", "File too large"}, job[1]);
         EXPECT_EQ(listing(), before);
@@ -82,8 +81,8 @@ TEST_F(Output, AWriteThatFailsLeavesNothing) {
 }
 
 TEST_F(Output, AFullDeviceIsTold) {
-    for (const auto& job : {std::vector<std::string>{"transcode", "in.wav", "-o", "/dev/full"},
-                            {"transcode", kCard, "-o", "/dev/full"}})
+    for (const auto& job :
+         {Words{"transcode", "in.wav", "-o", "/dev/full"}, {"transcode", kCard, "-o", "/dev/full"}})
         fails(4, job, {"'/dev/full'", "No space left on device"});
 }
 

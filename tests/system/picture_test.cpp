@@ -34,7 +34,7 @@ TEST_F(Picture, FramesBetweenPointsAreThoseOfTheInput) {
     makeYuv("clip.yuv", 100);
     const std::string clip = contents("clip.yuv");
     const struct {
-        std::vector<std::string> points;
+        Words points;
         size_t first, count;
     } cases[] = {
         {{"--from", "1", "--to", "3"}, 25, 50},
@@ -45,9 +45,7 @@ TEST_F(Picture, FramesBetweenPointsAreThoseOfTheInput) {
     };
     for (const auto& c : cases) {
         SCOPED_TRACE(testing::PrintToString(c.points));
-        std::vector<std::string> job = asYuv({"transcode", "clip.yuv", "-o", "part.yuv", "-y"});
-        job.insert(job.end(), c.points.begin(), c.points.end());
-        const Outcome o = works(job);
+        const Outcome o = works(asYuv({"transcode", "clip.yuv", "-o", "part.yuv", "-y"}) + c.points);
         EXPECT_TRUE(clip.substr(c.first * kFrame, c.count * kFrame) == contents("part.yuv"));
         EXPECT_THAT(o.err, testing::HasSubstr(", " + std::to_string(c.count) + " frame"));
     }
@@ -56,8 +54,8 @@ TEST_F(Picture, FramesBetweenPointsAreThoseOfTheInput) {
 TEST_F(Picture, PointsThatHoldNothing) {
     makeYuv("clip.yuv", 25);
     const struct {
-        std::vector<std::string> points;
-        std::vector<std::string> parts;
+        Words points;
+        Words parts;
     } cases[] = {
         {{"--from", "3"}, {"--from 3", "behind the end", "0:00:01.000"}},
         {{"--from", "0.5", "--to", "0.2"}, {"--to 0.2", "--from 0.5"}},
@@ -67,9 +65,7 @@ TEST_F(Picture, PointsThatHoldNothing) {
         {{"--from", "99999999999999999999"}, {"is not a time"}},
     };
     for (const auto& c : cases) {
-        std::vector<std::string> job = asYuv({"transcode", "clip.yuv", "-o", "part.yuv"});
-        job.insert(job.end(), c.points.begin(), c.points.end());
-        fails(2, job, c.parts);
+        fails(2, asYuv({"transcode", "clip.yuv", "-o", "part.yuv"}) + c.points, c.parts);
     }
 }
 
@@ -77,9 +73,7 @@ TEST_F(Picture, AFileThatEndsWithinAFrame) {
     makeYuv("clip.yuv", 2.5);
     const auto job = asYuv({"transcode", "clip.yuv", "-o", "out.yuv"});
     fails(3, job, {"'clip.yuv' is damaged", "frame 3", "2 whole", "--accept-partial"});
-    auto partial = job;
-    partial.push_back("--accept-partial");
-    works(partial);
+    works(job + Words{"--accept-partial"});
     EXPECT_TRUE(contents("clip.yuv").substr(0, 2 * kFrame) == contents("out.yuv"));
 }
 

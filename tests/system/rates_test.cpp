@@ -28,7 +28,7 @@ TEST_F(Rates, FramesAndSamplesAreCountedAndRight) {
     const struct {
         int frames;
         const char *raw, *out;
-        std::vector<std::string> more;
+        Words more;
         unsigned inSamples;
         long long written, samples;
         const char* first;
@@ -54,11 +54,10 @@ TEST_F(Rates, FramesAndSamplesAreCountedAndRight) {
         makeCounted("in.yuv", row.frames);
         const std::string sound = contents(makeWav("in.wav", row.inSamples));
         const std::string format = std::string("size=64x48,pixel=I420,") + row.raw;
-        std::vector<std::string> arguments{"transcode", "in.yuv", "in.wav", "--raw", format, "-o", "o.raw"};
-        arguments.insert(arguments.end(), {"-y", "--rate", row.out});
-        arguments.insert(arguments.end(), row.more.begin(), row.more.end());
         const std::string what = std::string(row.raw) + " to " + row.out;
-        works(arguments);
+        works(
+            Words{"transcode", "in.yuv", "in.wav", "--raw", format, "-o", "o.raw", "-y", "--rate", row.out} +
+            row.more);
         EXPECT_EQ(size("o.raw"), row.written * static_cast<long long>(kFrame)) << what;
         const auto seen =
             static_cast<std::size_t>(std::count(row.first, row.first + std::strlen(row.first), ' '));

@@ -20,12 +20,8 @@ class Signal : public Tool {
         pollfd data{reader, POLLIN, 0};
         return poll(&data, 1, Process::kPatience) == 1;
     }
-    static std::vector<std::string> intoPipe() {
-        return words({"transcode", kLarge, "-o", "pipe.raw", "--progress", "json"});
-    }
-    static std::vector<std::string> endless() {
-        return words({"transcode", kEndless, "-o", "out.raw", "--progress", "json"});
-    }
+    static Words intoPipe() { return words({"transcode", kLarge, "-o", "pipe.raw", "--progress", "json"}); }
+    static Words endless() { return words({"transcode", kEndless, "-o", "out.raw", "--progress", "json"}); }
 };
 
 TEST_F(Signal, StopsAndLeavesWhatWasThere) {
@@ -35,9 +31,7 @@ TEST_F(Signal, StopsAndLeavesWhatWasThere) {
     } cases[] = {{SIGINT, 130, {}}, {SIGTERM, 143, {}}, {SIGHUP, 129, {"out.raw"}}};
     for (const auto& c : cases) {
         for (const auto& name : c.before) folder.write(name, "precious");
-        auto job = endless();
-        job.push_back("-y");
-        Process run(job, here());
+        Process run(endless() + Words{"-y"}, here());
         ASSERT_TRUE(run.waitFor("\"event\":\"progress\""));
         run.signal(c.signal);
         const Outcome o = run.finish();

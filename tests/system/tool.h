@@ -15,6 +15,13 @@
 #include "tests/support/temp_folder.h"
 #include "tests/support/wav_bytes.h"
 
+using Words = std::vector<std::string>;
+
+inline Words operator+(Words a, const Words& b) {
+    a.insert(a.end(), b.begin(), b.end());
+    return a;
+}
+
 class Tool : public testing::Test {
   protected:
     static std::string program() { return QV_BINARY_DIR "/bin/tarsel"; }
@@ -24,31 +31,24 @@ class Tool : public testing::Test {
         options.folder = folder.path().string();
         return options;
     }
-    static std::vector<std::string> words(std::vector<std::string> arguments) {
-        arguments.insert(arguments.begin(), program());
-        return arguments;
-    }
-    Outcome tarsel(const std::vector<std::string>& arguments) const {
-        return runProgram(words(arguments), here());
-    }
-    Outcome tarsel(const std::vector<std::string>& arguments, const ProcessOptions& options) const {
+    static Words words(const Words& arguments) { return Words{program()} + arguments; }
+    Outcome tarsel(const Words& arguments) const { return runProgram(words(arguments), here()); }
+    Outcome tarsel(const Words& arguments, const ProcessOptions& options) const {
         return runProgram(words(arguments), options);
     }
 
     // A run that must do its work.
-    Outcome works(const std::vector<std::string>& arguments) const {
+    Outcome works(const Words& arguments) const {
         Outcome o = tarsel(arguments);
         EXPECT_EQ(o.status, 0) << o.err << testing::PrintToString(arguments);
         return o;
     }
 
     // A run that must fail with this status and one line with all of `parts`, and leave the folder as it was.
-    void fails(int status, const std::vector<std::string>& arguments,
-               const std::vector<std::string>& parts) const {
+    void fails(int status, const Words& arguments, const Words& parts) const {
         failsAs(status, tarselBetween(arguments), parts, testing::PrintToString(arguments));
     }
-    void failsAs(int status, const Outcome& o, const std::vector<std::string>& parts,
-                 const std::string& what) const {
+    void failsAs(int status, const Outcome& o, const Words& parts, const std::string& what) const {
         EXPECT_EQ(o.status, status) << what << o.err;
         EXPECT_EQ(std::count(o.err.begin(), o.err.end(), '\n'), 1) << what << o.err;
         EXPECT_EQ(o.err.rfind("tarsel: ", 0), 0u) << o.err;
@@ -81,15 +81,14 @@ class Tool : public testing::Test {
     std::string makeYuv(const std::string& name, double frames) const {
         return folder.write(name, patternBytes(static_cast<size_t>(frames * static_cast<double>(kFrame))));
     }
-    static std::vector<std::string> asYuv(std::vector<std::string> arguments) {
-        arguments.insert(arguments.end(), {"--raw", "size=64x48,pixel=I420,rate=25"});
-        return arguments;
+    static Words asYuv(const Words& arguments) {
+        return arguments + Words{"--raw", "size=64x48,pixel=I420,rate=25"};
     }
 
     TempFolder folder;
 
   private:
-    Outcome tarselBetween(const std::vector<std::string>& arguments) const {
+    Outcome tarselBetween(const Words& arguments) const {
         const auto before = listing();
         const Outcome o = tarsel(arguments);
         EXPECT_EQ(listing(), before) << testing::PrintToString(arguments);
