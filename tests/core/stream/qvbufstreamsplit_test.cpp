@@ -18,11 +18,6 @@ void unit(QvBufStream& stream, unsigned id, std::string_view data) {
     tell(stream.input(), id, static_cast<uint32_t>(data.size()));
 }
 
-AnyDict with(AnyDict params, const char* key, const Any& value) {
-    params.set(key, value);
-    return params;
-}
-
 Texts namesIn(const TempFolder& folder) {
     Texts names;
     for (const auto& entry : std::filesystem::directory_iterator(folder.path()))
@@ -31,30 +26,43 @@ Texts namesIn(const TempFolder& folder) {
     return names;
 }
 
-AnyDict pictures(const TempFolder& folder, const char* name = "clip.m2v") {
-    return AnyDict("outfilename", folder.file(name).c_str(), "size", 4096, "chunk", 513);
-}
+struct QvBsSplitVideoTest : testing::Test {
+    AnyDict pictures() const {
+        return AnyDict("outfilename", folder.file("clip.m2v").c_str(), "size", 4096, "chunk", 513);
+    }
+    TempFolder folder;
+    QvBsSplitVideo stream;
+};
 
-TEST(QvBsSplitVideo, EachUnitIsAFileWithANumber) {
+struct QvBsSplitAudioTest : testing::Test {
+    void begin(int rate, int channels, int bits, int split = 0, int result = 0) {
+        const AnyDict params("outfilename", folder.file("take.wav").c_str(), "samplerate", rate, "channels",
+                             channels, "bitsPerSample", bits, "split", split, "size", 20'000, "chunk", 1001);
+        ASSERT_EQ(stream.init(params), result) << rate << ' ' << channels << ' ' << bits << ' ' << split;
+    }
+    TempFolder folder;
+    QvBsSplitAudio stream;
+};
+
+TEST_F(QvBsSplitVideoTest, EachUnitIsAFileWithANumber) {
     for (const auto& [digits, names] : {std::pair{Any(), Texts{"clip#0.m2v", "clip#1.m2v"}},
                                         {4, {"clip#0000.m2v", "clip#0001.m2v"}},
                                         {-3, {"clip#0.m2v", "clip#1.m2v"}}}) {
-        TempFolder folder;
-        QvBsSplitVideo stream;
-        ASSERT_EQ(stream.init(with(pictures(folder), "nrDigits", digits)), 0);
+        AnyDict params = pictures();
+        params.set("nrDigits", digits);
+        ASSERT_EQ(stream.init(params), 0);
         unit(stream, VIDEO_AU_CODE, patternBytes(2000, 1));  // larger than a chunk
         unit(stream, VIDEO_AU_CODE, "");
         stream.destroy(0);
         EXPECT_EQ(namesIn(folder), names);
         EXPECT_TRUE(TempFolder::read(folder.file(names[0])) == patternBytes(2000, 1));
         EXPECT_EQ(TempFolder::read(folder.file(names[1])), "");
+        for (const auto& name : names) std::filesystem::remove(folder.file(name));
     }
 }
 
-TEST(QvBsSplitVideo, UnitsRunOverTheEndOfTheRing) {
-    TempFolder folder;
-    QvBsSplitVideo stream;
-    ASSERT_EQ(stream.init(with(pictures(folder), "split", 1)), 0);
+TEST_F(QvBsSplitVideoTest, UnitsRunOverTheEndOfTheRing) {
+    ASSERT_EQ(stream.init(pictures()), 0);
     for (unsigned i = 0; i < 20; ++i) {
         unit(stream, VIDEO_AU_CODE, patternBytes(1500 + i, i));
         const std::string name = folder.file("clip#" + std::to_string(i) + ".m2v");
@@ -62,11 +70,9 @@ TEST(QvBsSplitVideo, UnitsRunOverTheEndOfTheRing) {
     }
 }
 
-TEST(QvBsSplitVideo, FailuresStopTheRingAndUseUpANumber) {
-    TempFolder folder;
-    QvBsSplitVideo stream;
+TEST_F(QvBsSplitVideoTest, FailuresStopTheRingAndUseUpANumber) {
     std::filesystem::create_directory(folder.file("clip#0.m2v"));
-    ASSERT_EQ(stream.init(pictures(folder)), 0);
+    ASSERT_EQ(stream.init(pictures()), 0);
     unit(stream, VIDEO_AU_CODE, "abc");
     EXPECT_EQ(copyIn(stream.input(), "x"), 0u);
     EXPECT_NE(stream.ioError(), 0);
@@ -76,7 +82,7 @@ TEST(QvBsSplitVideo, FailuresStopTheRingAndUseUpANumber) {
 
     FullDisc disc(100);
     PlatformScope scope(disc);
-    ASSERT_EQ(stream.init(pictures(folder)), 0);
+    ASSERT_EQ(stream.init(pictures()), 0);
     EXPECT_EQ(stream.ioError(), 0);
     std::filesystem::remove(folder.file("clip#0.m2v"));
     unit(stream, VIDEO_AU_CODE, patternBytes(300));
@@ -84,11 +90,9 @@ TEST(QvBsSplitVideo, FailuresStopTheRingAndUseUpANumber) {
     EXPECT_FALSE(stream.input()->request(stream.input(), 1));
 }
 
-TEST(QvBsSplitVideo, PicturesBecomePng) {
-    TempFolder folder;
+TEST_F(QvBsSplitVideoTest, PicturesBecomePng) {
     QvFrame picture;
     const std::string pixels = patternBytes(20 * 92);  // rows of 90 bytes end at a multiple of 4
-    QvBsSplitVideo stream;
     AnyDict params("outfilename", folder.file("p.raw").c_str(), "size", 10'000, "chunk", 4000);
     params.update(
         AnyDict("png", 1, "width", 30, "height", 20, "FOURCC", static_cast<int>(unsigned{QvFourcc::BGR3})));
@@ -112,17 +116,10 @@ TEST(QvBsSplitVideo, PicturesBecomePng) {
 
 // --- WAV
 
-AnyDict wav(const TempFolder& folder, int rate, int channels, int bits, int split = 0) {
-    return AnyDict("outfilename", folder.file("take.wav").c_str(), "samplerate", rate, "channels", channels,
-                   "bitsPerSample", bits, "split", split, "size", 20'000, "chunk", 1001);
-}
-
-TEST(QvBsSplitAudio, HeaderStatesTheStreamExactly) {
+TEST_F(QvBsSplitAudioTest, HeaderStatesTheStreamExactly) {
     for (const auto& [rate, channels, bits, width] :
          {std::tuple{48'000u, 2u, 16u, 2u}, {96'000, 6, 24, 3}, {48'000, 2, 20, 3}}) {
-        TempFolder folder;
-        QvBsSplitAudio stream;
-        ASSERT_EQ(stream.init(wav(folder, int(rate), int(channels), int(bits))), 0);
+        begin(int(rate), int(channels), int(bits));
         const std::string samples = patternBytes(width * channels * 100), name = folder.file("take.wav");
         unit(stream, AUDIO_AU_CODE, std::string_view(samples).substr(0, 700));  // may end inside a sample
         unit(stream, AUDIO_AU_CODE, std::string_view(samples).substr(std::min<size_t>(700, samples.size())));
@@ -140,11 +137,9 @@ TEST(QvBsSplitAudio, HeaderStatesTheStreamExactly) {
     }
 }
 
-TEST(QvBsSplitAudio, EachChannelIsAMonoFile) {
+TEST_F(QvBsSplitAudioTest, EachChannelIsAMonoFile) {
     for (const int bits : {8, 16, 20, 24, 32}) {
-        TempFolder folder;
-        QvBsSplitAudio stream;
-        ASSERT_EQ(stream.init(wav(folder, 100, 3, bits, 1)), 0);
+        begin(100, 3, bits, 1);
         const size_t width = static_cast<size_t>((bits + 7) / 8);
         const std::string samples = patternBytes(width * 3 * 700);
         for (size_t at = 0; at < samples.size();
@@ -167,10 +162,8 @@ TEST(QvBsSplitAudio, EachChannelIsAMonoFile) {
     }
 }
 
-TEST(QvBsSplitAudio, AStreamThatEndsInsideASampleIsTold) {
-    TempFolder folder;
-    QvBsSplitAudio stream;
-    ASSERT_EQ(stream.init(wav(folder, 48'000, 2, 16)), 0);
+TEST_F(QvBsSplitAudioTest, AStreamThatEndsInsideASampleIsTold) {
+    begin(48'000, 2, 16);
     unit(stream, AUDIO_AU_CODE, "0123456789");
     qv_log()->clear();
     tell(stream.input(), STREAM_END_CODE);
@@ -180,27 +173,22 @@ TEST(QvBsSplitAudio, AStreamThatEndsInsideASampleIsTold) {
     EXPECT_EQ(leNumber(file, 76, 4), 8u);
 }
 
-TEST(QvBsSplitAudio, RefusesWhatNoWavCanHold) {
-    TempFolder folder;
-    QvBsSplitAudio stream;
+TEST_F(QvBsSplitAudioTest, RefusesWhatNoWavCanHold) {
     const int impossible[][4] = {{0, 2, 16, 0},           {-1, 2, 16, 0},      {48'000, 0, 16, 0},
                                  {48'000, -2, 16, 0},     {48'000, 2, 0, 0},   {48'000, 2, 33, 0},
                                  {48'000, 70'000, 16, 0}, {48'000, 33, 16, 1}, {48'000, 2, -8, 1}};
     for (const auto& [rate, channels, bits, split] : impossible) {
-        EXPECT_EQ(stream.init(wav(folder, rate, channels, bits, split)), -1)
-            << rate << channels << bits << split;
+        begin(rate, channels, bits, split, -1);
         EXPECT_FALSE(stream.inited());
     }
     EXPECT_TRUE(namesIn(folder).empty());
 }
 
-TEST(QvBsSplitAudio, AFullDiscStopsTheRing) {
+TEST_F(QvBsSplitAudioTest, AFullDiscStopsTheRing) {
     for (const int split : {0, 1}) {
-        TempFolder folder;
         FullDisc disc(30'000);
         PlatformScope scope(disc);
-        QvBsSplitAudio stream;
-        ASSERT_EQ(stream.init(wav(folder, 1000, 2, 16, split)), 0);
+        begin(1000, 2, 16, split);
         int units = 0;
         while (units < 100 && stream.input()->request(stream.input(), 1)) {
             unit(stream, AUDIO_AU_CODE, patternBytes(4000));
@@ -208,6 +196,7 @@ TEST(QvBsSplitAudio, AFullDiscStopsTheRing) {
         }
         EXPECT_LT(units, 40);
         EXPECT_EQ(stream.ioError(), ENOSPC);
+        stream.destroy(1);
     }
 }
 

@@ -15,18 +15,6 @@ AnyDict source(const std::string& name, int size = 64) {
     return AnyDict("infilename", name.c_str(), "size", size);
 }
 
-// A stream in a folder of its own; most tests write to "a.bin".
-struct FileStream : testing::Test {
-    bufstream* begin(const std::string& name = "a.bin", int size = 64) {
-        EXPECT_EQ(stream.init(output(folder.file(name), size)), 0);
-        return stream.input();
-    }
-    std::string bytes(const std::string& name = "a.bin") const { return TempFolder::read(folder.file(name)); }
-
-    TempFolder folder;
-    QvFileBufStream stream;
-};
-
 std::string nameOf(bufstream* bs) {
     unsigned short units[300] = {};
     if (bs->auxinfo(bs, 0, FILE_NAME_INFO, units, sizeof units)) return "?";

@@ -6,6 +6,7 @@
 
 #include "core/stream/bufstream.h"
 #include "core/stream/qvbufstrm.h"
+#include "core/stream/qvfilebufstream.h"
 #include "tests/support/checks.h"
 #include "tests/support/wav_bytes.h"
 
@@ -57,8 +58,19 @@ T ask(bufstream* bs, unsigned id) {
     return value;
 }
 
-class HeardItems : public QvAuxInfoObserver {
-  public:
+// A file stream in a folder of its own; most tests write to "a.bin".
+struct FileStream : testing::Test {
+    bufstream* begin(const std::string& name = "a.bin", int size = 64) {
+        EXPECT_EQ(stream.init(AnyDict("outfilename", folder.file(name).c_str(), "size", size)), 0);
+        return stream.input();
+    }
+    std::string bytes(const std::string& name = "a.bin") const { return TempFolder::read(folder.file(name)); }
+
+    TempFolder folder;
+    QvFileBufStream stream;
+};
+
+struct HeardItems : QvAuxInfoObserver {
     explicit HeardItems(std::vector<std::string>& heard, std::string name = "")
         : heard_(heard), name_(name) {}
     void auxInfo(unsigned offset, unsigned id, void*, unsigned size) override {
@@ -66,7 +78,6 @@ class HeardItems : public QvAuxInfoObserver {
                          std::to_string(size));
     }
 
-  private:
     std::vector<std::string>& heard_;
     std::string name_;
 };
