@@ -1,9 +1,15 @@
-// What most tests of the core use: GoogleTest, folders, failing platforms, the log, names of both widths, and
-// the text of a failure.
+// What most tests of the core use: GoogleTest and the usual parts of the standard library, folders, failing
+// platforms, the log, names of both widths, and the text of a failure.
 #pragma once
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
+#include <cerrno>
+#include <climits>
+#include <cstring>
+#include <functional>
+#include <memory>
 #include <ostream>
 #include <string>
 #include <vector>

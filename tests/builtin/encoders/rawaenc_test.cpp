@@ -1,7 +1,5 @@
 #include "builtin/encoders/rawaenc.h"
 
-#include <memory>
-
 #include "builtin/encoders/qvdummyaudio.h"
 #include "builtin/modules.h"
 #include "core/media/qvgeometry.h"

@@ -1,7 +1,6 @@
 #include "builtin/encoders/rawvenc.h"
 
 #include <future>
-#include <memory>
 
 #include "builtin/encoders/rawoutput.h"
 #include "builtin/modules.h"

@@ -1,11 +1,8 @@
 // Deep lines: every vector unit of the machine gives the bytes of the plain loops.
 #include "builtin/kernels/rows16.h"
 
-#include <gtest/gtest.h>
-
 #include <cmath>
 #include <cstdlib>
-#include <vector>
 
 #include "builtin/kernels/deep.h"
 #include "tests/support/line_kernels.h"

@@ -1,8 +1,6 @@
 // Every vector unit of the machine gives the bytes of the plain loops, and touches nothing else.
 #include "builtin/kernels/rows8.h"
 
-#include <gtest/gtest.h>
-
 #include <array>
 #include <cmath>
 

@@ -1,10 +1,6 @@
 // Every vector unit of the machine gives the samples of the plain formulas, and touches nothing else.
 #include "builtin/kernels/samplerows.h"
 
-#include <gtest/gtest.h>
-
-#include <vector>
-
 #include "builtin/kernels/deep.h"
 #include "builtin/kernels/rgbchroma.h"
 #include "builtin/kernels/rows16.h"

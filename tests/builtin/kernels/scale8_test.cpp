@@ -1,12 +1,8 @@
 // The filters, and both passes of scaling on every vector unit.
 #include "builtin/kernels/scale8.h"
 
-#include <gtest/gtest.h>
-
 #include <cmath>
 #include <numeric>
-#include <string>
-#include <vector>
 
 #include "builtin/kernels/deep.h"
 #include "tests/support/line_kernels.h"

@@ -1,5 +1,3 @@
-#include <cstring>
-
 #include "core/engine/qvutil.h"
 #include "core/preset/qvprofile.h"
 #include "core/stream/qvbufstrm.h"

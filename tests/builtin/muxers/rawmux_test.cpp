@@ -1,8 +1,5 @@
 #include "builtin/muxers/rawmux.h"
 
-#include <algorithm>
-#include <filesystem>
-
 #include "tests/support/checks.h"
 #include "tests/support/output_pipe.h"
 

@@ -1,7 +1,5 @@
 #include "builtin/pipes/audiopipe.h"
 
-#include <memory>
-
 #include "tests/support/checks.h"
 #include "tests/support/fake_filters.h"
 #include "tests/support/fake_streams.h"

@@ -1,8 +1,5 @@
 #include "builtin/pipes/encodepipe2.h"
 
-#include <filesystem>
-#include <functional>
-
 #include "core/filter/filtersstate.h"
 #include "core/media/qvgeometry.h"
 #include "core/preset/qvpresetmgr.h"

@@ -1,6 +1,4 @@
 // Each member of the pipe fails at each point, as a status and as a broken contract.
-#include <algorithm>
-#include <filesystem>
 
 #include "core/encode/qvencodepipe.h"
 #include "tests/support/checks.h"

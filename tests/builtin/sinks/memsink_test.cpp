@@ -1,7 +1,6 @@
 #include "builtin/sinks/memsink.h"
 
 #include <atomic>
-#include <thread>
 
 #include "core/stream/auxinfoid.h"
 #include "tests/support/checks.h"

@@ -1,8 +1,5 @@
 #include "core/caption/qvsubtitlerender.h"
 
-#include <algorithm>
-#include <climits>
-#include <functional>
 #include <set>
 
 #include "core/arch/platform.h"

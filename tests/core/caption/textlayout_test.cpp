@@ -1,4 +1,3 @@
-
 #include "core/arch/platform.h"
 #include "core/caption/textlayout_p.h"
 #include "core/caption/textmask_p.h"

@@ -1,7 +1,5 @@
 #include "core/media/mediatime.h"
 
-#include <climits>
-
 #include "core/media/qvgeometry.h"
 #include "tests/support/checks.h"
 

@@ -1,8 +1,5 @@
 #include "core/media/qvdraw.h"
 
-#include <algorithm>
-#include <climits>
-#include <cstring>
 #include <set>
 
 #include "core/media/qvframe.h"

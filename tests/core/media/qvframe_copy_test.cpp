@@ -1,6 +1,4 @@
 // Copies and field operations on pictures with a letter in each row.
-#include <algorithm>
-#include <functional>
 
 #include "core/media/qvframe.h"
 #include "tests/core/media/frame_model.h"

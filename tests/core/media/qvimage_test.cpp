@@ -3,9 +3,7 @@
 #include <png.h>
 #include <zlib.h>
 
-#include <algorithm>
 #include <cstdio>
-#include <memory>
 
 #include "core/media/qvframe.h"
 #include "tests/core/media/frame_model.h"

@@ -1,7 +1,5 @@
 #include "core/media/qvpcm.h"
 
-#include <climits>
-
 #include "core/engine/status.h"
 #include "tests/support/checks.h"
 #include "tests/support/pictures.h"

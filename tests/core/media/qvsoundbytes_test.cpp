@@ -2,8 +2,6 @@
 
 #include <zlib.h>
 
-#include <memory>
-
 #include "tests/support/checks.h"
 
 namespace {

@@ -1,7 +1,5 @@
 #include "core/media/timecode.h"
 
-#include <climits>
-
 #include "core/media/qvframerate.h"
 #include "tests/support/checks.h"
 

@@ -2,7 +2,6 @@
 
 #include <gmock/gmock.h>
 
-#include <algorithm>
 #include <deque>
 #include <random>
 

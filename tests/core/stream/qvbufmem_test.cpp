@@ -1,7 +1,5 @@
 #include "core/stream/qvbufmem.h"
 
-#include <thread>
-
 #include "streamtools.h"
 
 namespace {

@@ -2,8 +2,6 @@
 
 #include <gmock/gmock.h>
 
-#include <cerrno>
-
 #include "core/media/qvframe.h"
 #include "core/media/qvimage.h"
 #include "core/stream/wavheader_p.h"

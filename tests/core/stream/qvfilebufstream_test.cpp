@@ -1,7 +1,5 @@
 #include "core/stream/qvfilebufstream.h"
 
-#include <cerrno>
-
 #include "streamtools.h"
 
 namespace {

@@ -1,7 +1,6 @@
 // Short forms for driving bufstream records in tests.
 #pragma once
 
-#include <cstring>
 #include <string_view>
 
 #include "core/stream/bufstream.h"

@@ -1,5 +1,3 @@
-
-#include <algorithm>
 #include <limits>
 
 #include "tests/support/checks.h"

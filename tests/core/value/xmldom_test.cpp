@@ -1,7 +1,6 @@
 #include "core/value/xmldom.h"
 
 #include <cstdio>
-#include <memory>
 
 #include "tests/support/checks.h"
 

@@ -2,7 +2,6 @@
 
 #include <cmath>
 #include <limits>
-#include <memory>
 
 #include "core/media/qvgeometry.h"
 #include "tests/support/checks.h"
