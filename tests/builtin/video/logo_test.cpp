@@ -199,7 +199,7 @@ TEST_F(Logos, MoviesRunFrameByFrame) {
     Animated twice(playing(format, {{"scale", 200}, {"xpos", -10}, {"ypos", -4}}));
     QvFrame in = mixed(nullptr, 0, 0, 0, 100, 80);
     const QvFrame& out = twice.through(in);
-    EXPECT_NEAR(out.pixelPtr(42 + 21, 34 + 21)[2], 255 * 10 / 21, 14);
+    EXPECT_NEAR(out.pixelPtr(42 + 21, 34 + 21)[2], 255 * 10 / 21.0, 14);
     EXPECT_EQ(out.pixelPtr(42 + 21, 34 + 21)[1], 30);
     for (int i = 0; i < 100 * 80; ++i) EXPECT_LE(out.pixelPtr(i % 100, i / 100)[1], 92) << i;
     Animated covering(playing(AnyDict("FOURCC", "BGR4", "width", 24, "height", 21), {}));

@@ -140,7 +140,7 @@ TEST(QvCrop, PicturesOfEveryFormatAreCutAndPadded) {
             for (int y = 0; y < 32 / down; ++y)
                 std::memcpy(wanted.plane(p) + wanted.stride(p) * (y + 10 / down) + 4 / across * bytes,
                             rowOf(in, p, y + 4 / down) + 8 / across * bytes,
-                            static_cast<size_t>(36 / across * bytes));
+                            static_cast<size_t>(36 / across) * static_cast<size_t>(bytes));
         }
         Opened crop({{"inputWidth", 64}, {"inputHeight", 48}, {"mode", 1}, {"padTop", 10}, {"padBottom", 2}});
         crop.setParamDict(AnyDict("cropBox", QvRect(8, 4, 44, 36), "padLeft", 4));
