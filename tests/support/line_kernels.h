@@ -80,62 +80,30 @@ auto checked(Run run, Formula formula) {
     };
 }
 
-// One line at a time, ending `gap` bytes before the page without access.
-class LineMemory {
-  public:
-    unsigned char* place(size_t bytes, size_t gap, unsigned seed) {
-        line_ = end() - gap - bytes;
-        bytes_ = bytes;
-        std::memset(line_ - around, mark, around);
-        std::memset(line_ + bytes, mark, gap);
-        fillBytes(line_, bytes, seed);
-        return line_;
-    }
-    std::string bytes() const { return {reinterpret_cast<const char*>(line_), bytes_}; }
-    bool intact() {
-        for (const unsigned char* at = line_ - around; at < end(); ++at)
-            if ((at < line_ || at >= line_ + bytes_) && *at != mark) return false;
-        return true;
-    }
-
-  private:
-    static constexpr size_t around = 64;
-    static constexpr unsigned char mark = 0xA5;
-    unsigned char* end() { return room_.data() + room_.size(); }
-    Guarded room_{4096};
-    unsigned char* line_ = nullptr;
-    size_t bytes_ = 0;
-};
-
 class UnitRunner {
   public:
     // What is in the lines behind a run.
     std::string run(const LineKernel& kernel, size_t n, size_t gap, bool inPlace, int64_t target) {
         LineCase lines{{}, {}, n};
-        for (unsigned i = 0; i < 8; ++i)
-            if (const LineSize& size = kernel.in[i]; size.times)
-                lines.in[i] = in_[i].place(size.of(n), gap * size.align, i + static_cast<unsigned>(n));
-        for (unsigned i = 0; i < 4; ++i)
-            if (const LineSize& size = kernel.out[i]; size.times)
-                lines.out[i] = inPlace ? lines.in[i] : out_[i].place(size.of(n), gap * size.align, 77 + i);
+        for (unsigned i = 0; i < 12; ++i) {
+            const LineSize& size = i < 8 ? kernel.in[i] : kernel.out[i - 8];
+            unsigned char* const line =
+                memory_[i].place(size.of(n), gap * size.align, i + static_cast<unsigned>(n));
+            if (size.times)
+                (i < 8 ? lines.in[i] : lines.out[i - 8]) = i < 8 || !inPlace ? line : lines.in[i - 8];
+        }
         {
             const OnTarget only(target);
             kernel.run(lines);
         }
         std::string result;
-        const auto look = [&](LineMemory& line, const unsigned char* used) {
-            if (!used) return;
-            result += line.bytes();
-            if (!line.intact()) result += "written beside the line";
-        };
-        for (int i = 0; i < 8; ++i) look(in_[i], lines.in[i]);
-        for (int i = 0; i < 4; ++i)
-            if (!inPlace) look(out_[i], lines.out[i]);
+        for (const Guarded& memory : memory_)
+            result += memory.intact() ? memory.bytes() : "written beside the line";
         return result;
     }
 
   private:
-    LineMemory in_[8], out_[4];
+    Guarded memory_[12];
 };
 
 // Widths 1 to 129, and every distance from the end of the memory up to a vector.

@@ -23,20 +23,17 @@ class OutputPipe : public testing::Test {
     void addVideo(unsigned type, int width, int height, const QvFramerate& rate = QvFramerate(25.0)) {
         const int nr = pipe_->addVideoStream("rawvenc");
         ASSERT_GE(nr, 0) << pipe_->errorDesc();
-        for (const auto& [name, value] : {std::pair<const char*, Any>("type", static_cast<int>(type)),
-                                          {"width", width},
-                                          {"height", height},
-                                          {"framerate", rate}})
-            ASSERT_EQ(pipe_->videoEncoder(nr)->setParam(name, value), 0) << name;
+        const AnyDict params("type", static_cast<int>(type), "width", width, "height", height, "framerate",
+                             rate);
+        ASSERT_EQ(pipe_->videoEncoder(nr)->setParamDict(params), 0);
         videos_.resize(static_cast<size_t>(nr));
         videos_.push_back({type, width, height});
     }
     void addAudio(int channels, int bits, int samplerate) {
         const int nr = pipe_->addAudioStream("rawaenc");
         ASSERT_GE(nr, 0) << pipe_->errorDesc();
-        for (const auto& [name, value] :
-             {std::pair("channels", channels), {"bitsPerSample", bits}, {"samplerate", samplerate}})
-            ASSERT_EQ(pipe_->audioEncoder(nr)->setParam(name, value), 0) << name;
+        const AnyDict params("channels", channels, "bitsPerSample", bits, "samplerate", samplerate);
+        ASSERT_EQ(pipe_->audioEncoder(nr)->setParamDict(params), 0);
         audios_.resize(static_cast<size_t>(nr));
         audios_.push_back({channels, (bits + 7) / 8, samplerate});
     }

@@ -11,8 +11,8 @@ inline std::string leBytes(std::uint64_t value, int count) {
     return bytes;
 }
 
-inline std::uint32_t leNumber(std::string_view bytes, std::size_t at, int count) {
-    std::uint32_t value = 0;
+inline std::uint64_t leNumber(std::string_view bytes, std::size_t at, int count) {
+    std::uint64_t value = 0;
     while (count-- > 0)
         value = value << 8 | static_cast<unsigned char>(bytes.at(at + static_cast<std::size_t>(count)));
     return value;

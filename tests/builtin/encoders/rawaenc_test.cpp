@@ -15,9 +15,8 @@ struct RawAudio : testing::Test {
     RawAudio() { enc().init(); }
     RawAudioEnc& enc() { return *enc_; }
     void format(int samplerate, int channels, int bits) {
-        ASSERT_EQ(enc().setParam("samplerate", samplerate), 0);
-        ASSERT_EQ(enc().setParam("channels", channels), 0);
-        ASSERT_EQ(enc().setParam("bitsPerSample", bits), 0);
+        const AnyDict params("samplerate", samplerate, "channels", channels, "bitsPerSample", bits);
+        ASSERT_EQ(enc().setParamDict(params), 0);
     }
     void start(const char* muxerName) {
         out_.data.clear();

@@ -14,15 +14,12 @@ namespace {
 
 struct RawVideo : testing::Test {
     RawVideo() { enc().init(); }
-    ~RawVideo() override { enc_.reset(); }
-
     RawVideoEnc& enc() { return *enc_; }
     Any get(const char* name) { return static_cast<QvCodec&>(enc()).getParam(name); }
     void format(unsigned type, int width, int height, bool accelerated = false) {
-        ASSERT_EQ(enc().setParam("type", static_cast<int>(type)), 0);
-        ASSERT_EQ(enc().setParam("width", width), 0);
-        ASSERT_EQ(enc().setParam("height", height), 0);
-        ASSERT_EQ(enc().setParam("accelerationOn", accelerated), 0);
+        const AnyDict params("type", static_cast<int>(type), "width", width, "height", height,
+                             "accelerationOn", int{accelerated});
+        ASSERT_EQ(enc().setParamDict(params), 0);
     }
     void start() {
         ASSERT_EQ(enc().attachOutStream(&out_), 0);

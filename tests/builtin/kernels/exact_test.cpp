@@ -4,15 +4,12 @@
 #include <algorithm>
 #include <array>
 #include <cmath>
-#include <cstdlib>
-#include <cstring>
 #include <numbers>
 #include <vector>
 
 #include "builtin/kernels/axis.h"
 #include "core/filter/srscaler.h"
 #include "core/media/fourcc.h"
-#include "tests/support/vector_targets.h"
 
 namespace {
 

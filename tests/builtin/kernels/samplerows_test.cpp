@@ -42,58 +42,39 @@ unsigned tens(const Byte* row, size_t i) { return sampleAt<uint32_t>(row, i / 3)
 }  // namespace
 
 TEST(SampleRows, AllUnitsFollowTheFormulas) {
-    std::vector<LineKernel> rows = {
-        {"weigh bytes",
-         {one},
-         {one},
-         checked<Byte>(
-             [](auto& l) { weighBytes(l.out[0], l.in[0], weights.scale8.data(), weights.add8.data(), l.n); },
-             [](auto& l, size_t i) { return (l.in[0][i] * weights.scale8[i] + weights.add8[i]) >> 8; }),
-         true},
-        {"weigh words",
-         {twoBytes},
-         {twoBytes},
-         checked<uint16_t>(
-             [](auto& l) {
-                 weighWords(l.out[0], l.in[0], weights.scale16.data(), weights.add16.data(), l.n);
-             },
-             [](auto& l, size_t i) {
-                 return (sampleAt<uint16_t>(l.in[0], i) * weights.scale16[i] + weights.add16[i]) >> 16;
-             }),
-         true},
-        {"weigh tens",
-         {four},
-         {four},
-         [](const LineCase& l) {
-             std::vector<unsigned> wanted;
-             for (size_t i = 0; i < 3 * l.n; ++i)
-                 wanted.push_back((tens(l.in[0], i) * weights.scale16[i] + weights.add10[i]) >> 16);
-             weighTens(l.out[0], l.in[0], weights.scale16.data(), weights.add10.data(), l.n);
-             for (size_t i = 0; i < 3 * l.n; ++i) ASSERT_EQ(tens(l.out[0], i), wanted[i]) << i;
-         },
-         true},
+    const auto bytes = checked<Byte>(
+        [](auto& l) { weighBytes(l.out[0], l.in[0], weights.scale8.data(), weights.add8.data(), l.n); },
+        [](auto& l, size_t i) { return (l.in[0][i] * weights.scale8[i] + weights.add8[i]) >> 8; });
+    const auto words = checked<uint16_t>(
+        [](auto& l) { weighWords(l.out[0], l.in[0], weights.scale16.data(), weights.add16.data(), l.n); },
+        [](auto& l, size_t i) {
+            return (sampleAt<uint16_t>(l.in[0], i) * weights.scale16[i] + weights.add16[i]) >> 16;
+        });
+    const auto packed = [](const LineCase& l) {
+        std::vector<unsigned> wanted;
+        for (size_t i = 0; i < 3 * l.n; ++i)
+            wanted.push_back((tens(l.in[0], i) * weights.scale16[i] + weights.add10[i]) >> 16);
+        weighTens(l.out[0], l.in[0], weights.scale16.data(), weights.add10.data(), l.n);
+        for (size_t i = 0; i < 3 * l.n; ++i) ASSERT_EQ(tens(l.out[0], i), wanted[i]) << i;
     };
-    static Byte table8[256];
+    std::vector<LineKernel> rows = {{"weigh bytes", {one}, {one}, bytes, true},
+                                    {"weigh words", {twoBytes}, {twoBytes}, words, true},
+                                    {"weigh tens", {four}, {four}, packed, true}};
+    Byte table8[256];
     for (int i = 0; i < 256; ++i) table8[i] = static_cast<Byte>(i * 151 + 7);
     for (const unsigned chosen : {15u, 5u, 10u, 7u, 14u}) {
-        rows.push_back({"look up bytes",
-                        {one},
-                        {one},
-                        checked<Byte>([=](auto& l) { lookUpBytes(l.out[0], l.in[0], table8, chosen, l.n); },
-                                      [=](auto& l, size_t i) {
-                                          return chosen >> i % 4 & 1 ? table8[l.in[0][i]] : l.in[0][i];
-                                      }),
-                        true});
-        rows.push_back(
-            {"look up words",
-             {twoBytes},
-             {twoBytes},
-             checked<uint16_t>([=](auto& l) { lookUpWords(l.out[0], l.in[0], table16.data(), chosen, l.n); },
-                               [=](auto& l, size_t i) {
-                                   const auto sample = sampleAt<uint16_t>(l.in[0], i);
-                                   return chosen >> i % 4 & 1 ? table16[sample] : sample;
-                               }),
-             true});
+        const auto isChosen = [=](size_t i) { return (chosen >> i % 4 & 1) != 0; };
+        const auto found8 = checked<Byte>(
+            [&table8, chosen](auto& l) { lookUpBytes(l.out[0], l.in[0], table8, chosen, l.n); },
+            [&table8, isChosen](auto& l, size_t i) { return isChosen(i) ? table8[l.in[0][i]] : l.in[0][i]; });
+        const auto found16 =
+            checked<uint16_t>([=](auto& l) { lookUpWords(l.out[0], l.in[0], table16.data(), chosen, l.n); },
+                              [=](auto& l, size_t i) {
+                                  const auto sample = sampleAt<uint16_t>(l.in[0], i);
+                                  return isChosen(i) ? table16[sample] : sample;
+                              });
+        rows.push_back({"look up bytes", {one}, {one}, found8, true});
+        rows.push_back({"look up words", {twoBytes}, {twoBytes}, found16, true});
     }
     compareUnits(rows);
 }

@@ -116,10 +116,10 @@ TEST(Scale8, LinesAreAddedUpAlike) {
                 Guarded to(static_cast<size_t>(n), 9);
                 const OnTarget only(target);
                 scaleDown(starts, weights, taps, to.data(), n);
-                const std::string bytes(reinterpret_cast<char*>(to.data()), to.size());
-                if (expected.empty()) expected = bytes;
-                ASSERT_EQ(bytes, expected) << taps << " taps, " << n << " on " << hwy::TargetName(target);
-                EXPECT_TRUE(to.frontIntact());
+                if (expected.empty()) expected = to.bytes();
+                ASSERT_EQ(to.bytes(), expected)
+                    << taps << " taps, " << n << " on " << hwy::TargetName(target);
+                EXPECT_TRUE(to.intact());
             }
         }
     }

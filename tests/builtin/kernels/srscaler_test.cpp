@@ -106,7 +106,7 @@ TEST(Conversion, NothingOutsideOfThePicturesIsTouched) {
                         to(bytesOf("YUYV", w + 3, h + 1), 5);
                     convert("I420", from.data(), w, h, name, middle.data(), w, h, flags);
                     convert(name, middle.data(), w, h, "YUYV", to.data(), w + 3, h + 1, flags);
-                    ASSERT_TRUE(from.frontIntact() && middle.frontIntact() && to.frontIntact())
+                    ASSERT_TRUE(from.intact() && middle.intact() && to.intact())
                         << name << ' ' << w << 'x' << h;
                 }
 }
@@ -380,5 +380,5 @@ TEST(Scaling, LongestLines) {
         wide(bytesOf("UYVY", longest, 3));
     convert("BGR3", from.data(), longest, 2, "I420", to.data(), 5, 4, 2);
     convert("I420", to.data(), 5, 4, "UYVY", wide.data(), longest, 3, 1);
-    EXPECT_TRUE(to.frontIntact() && wide.frontIntact());
+    EXPECT_TRUE(to.intact() && wide.intact());
 }

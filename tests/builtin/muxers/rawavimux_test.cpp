@@ -1,3 +1,5 @@
+#include <numeric>
+
 #include "core/engine/qvutil.h"
 #include "core/preset/qvprofile.h"
 #include "core/stream/qvbufstrm.h"
@@ -16,11 +18,10 @@ class AviReader {
     struct Chunk {
         std::string id;
         size_t data, bytes;
+        bool operator==(const Chunk&) const = default;
     };
     struct Stream {
-        std::string type, handler;
-        unsigned scale, rate, length, largest, unitBytes;
-        std::string format = {};
+        std::string header, format = {};
         std::vector<Chunk> chunks = {};    // by the super index
         std::vector<unsigned> units = {};  // that each of its places covers
     };
@@ -31,12 +32,7 @@ class AviReader {
         for (size_t i = 0; i < streams.size(); ++i) readIndex(i);
     }
 
-    unsigned long long number(size_t at, int width) const {
-        unsigned long long value = 0;
-        for (int i = width; i-- > 0;)
-            value = value << 8 | static_cast<unsigned char>(bytes_.at(at + static_cast<size_t>(i)));
-        return value;
-    }
+    size_t number(size_t at, int width) const { return leNumber(bytes_, at, width); }
     std::string text(size_t at) const { return bytes_.substr(at, 4); }
     std::string data(const Chunk& chunk) const { return bytes_.substr(chunk.data, chunk.bytes); }
     std::string all(size_t stream) const {
@@ -85,10 +81,9 @@ class AviReader {
             microseconds = word(0), firstFrames = word(16), width = word(32);
             declared_ = word(24);
         } else if (c.id == "strh") {
-            streams.push_back(
-                {text(c.data), text(c.data + 4), word(20), word(24), word(32), word(36), word(44)});
+            streams.push_back({data(c)});
         } else if (c.id == "strf") {
-            streams.back().format = bytes_.substr(c.data, c.bytes);
+            streams.back().format = data(c);
         } else if (c.id == "indx") {
             super_.push_back(c);
         } else if (c.id == "dmlh") {
@@ -166,13 +161,13 @@ TEST_F(RawAvi, PicturesOfEachType) {
         const auto avi = readAvi();
         ASSERT_EQ(avi.streams.size(), 1u);
         const auto& stream = avi.streams[0];
-        EXPECT_EQ(stream.handler, row.handler);
+        EXPECT_EQ(stream.header.substr(0, 8), std::string("vids") + row.handler);
         EXPECT_EQ(avi.all(0), row.expected + row.expected);
         EXPECT_EQ(stream.format.substr(4), leBytes(unsigned(row.width), 4) +
                                                leBytes(unsigned(row.height), 4) + leBytes(1, 2) +
                                                leBytes(unsigned(row.bits), 2) + leBytes(row.compression, 4) +
                                                leBytes(row.expected.size(), 4) + std::string(16, '\0'));
-        EXPECT_EQ(stream.largest, row.expected.size());
+        EXPECT_EQ(leNumber(stream.header, 36, 4), row.expected.size());
     }
 }
 
@@ -199,33 +194,25 @@ TEST_F(RawAvi, SegmentsAndInterleaving) {
     EXPECT_GT(avi.riffs, 10);
     EXPECT_LE(avi.longest, 20000u + 64 * 16 * 3 + 1000);  // the first holds the headers, too
     ASSERT_EQ(avi.streams.size(), 3u);
-    const std::string* given[] = {&pictures, &mono, &stereo};
-    const unsigned rates[] = {30000, rate, 48000}, scales[] = {1001, 1, 1}, units[] = {2048, 1, 4};
+    const struct {
+        const std::string& given;
+        unsigned scale, rate, unit;
+    } expected[] = {{pictures, 1001, 30000, 2048}, {mono, 1, rate, 1}, {stereo, 1, 48000, 4}};
     for (size_t i = 0; i < 3; ++i) {
+        const auto& [given, scale, samplerate, unit] = expected[i];
         const auto& stream = avi.streams[i];
-        EXPECT_TRUE(avi.all(i) == *given[i]) << i;
-        EXPECT_EQ(stream.type, i ? "auds" : "vids");
-        EXPECT_EQ(stream.rate, rates[i]);
-        EXPECT_EQ(stream.scale, scales[i]);
-        EXPECT_EQ(stream.length, given[i]->size() / units[i]);
-        EXPECT_EQ(stream.unitBytes, i ? units[i] : 0);
-        unsigned covered = 0;
-        for (const unsigned count : stream.units) covered += count;
-        EXPECT_EQ(covered, stream.length);
+        EXPECT_TRUE(avi.all(i) == given) << i;
+        EXPECT_EQ(stream.header.substr(20, 8), leBytes(scale, 4) + leBytes(samplerate, 4));
+        EXPECT_EQ(stream.header.substr(32, 4), leBytes(given.size() / unit, 4));
+        EXPECT_EQ(stream.header.substr(44, 4), leBytes(i ? unit : 0, 4));
+        EXPECT_EQ(std::accumulate(stream.units.begin(), stream.units.end(), 0u), given.size() / unit);
     }
-    EXPECT_EQ(avi.totalFrames, 40u);
-    EXPECT_EQ(avi.microseconds, 33367u);
-    EXPECT_EQ(avi.width, 32u);
+    EXPECT_TRUE(avi.totalFrames == 40 && avi.microseconds == 33367 && avi.width == 32);
 
     // The old index covers the first segment, and nothing else.
-    ASSERT_FALSE(avi.oldIndex.empty());
-    unsigned first = 0;
-    for (size_t i = 0; i < avi.oldIndex.size(); ++i) {
-        EXPECT_EQ(avi.oldIndex[i].id, avi.inOrder[i].id);
-        EXPECT_EQ(avi.oldIndex[i].data, avi.inOrder[i].data);
-        EXPECT_EQ(avi.oldIndex[i].bytes, avi.inOrder[i].bytes);
-        first += avi.oldIndex[i].id == "00db";
-    }
+    ASSERT_TRUE(std::equal(avi.oldIndex.begin(), avi.oldIndex.end(), avi.inOrder.begin()));
+    const auto first =
+        std::count_if(avi.oldIndex.begin(), avi.oldIndex.end(), [](auto& c) { return c.id == "00db"; });
     EXPECT_EQ(first, avi.firstFrames);
     EXPECT_EQ(first, avi.streams[0].units[0]);
 
@@ -240,7 +227,10 @@ TEST_F(RawAvi, SegmentsAndInterleaving) {
 }
 
 TEST_F(RawAvi, SoundFormats) {
-    for (const auto& [channels, bits, tag] : {std::tuple{2, 16, 1}, {6, 16, 0xFFFE}, {1, 20, 0xFFFE}}) {
+    for (const auto& [channels, bits, format] :
+         {std::tuple(2, 16, wavFormat(1, 2, 48000, 16) + leBytes(0, 2)),
+          {6, 16, wavExtensible(1, 6, 48000, 16, 0x3F)},
+          {1, 20, wavExtensible(1, 1, 48000, 24, 4).replace(18, 1, "\x14")}}) {
         SCOPED_TRACE(testing::Message() << channels << " channels, " << bits << " bits");
         pipe_->clearStreams();
         addAudio(channels, bits, 48000);
@@ -250,14 +240,8 @@ TEST_F(RawAvi, SoundFormats) {
         const auto avi = readAvi();
         ASSERT_EQ(avi.streams.size(), 1u);
         EXPECT_TRUE(avi.all(0) == given);
-        EXPECT_EQ(avi.streams[0].length, 100001u);
-        const std::string& format = avi.streams[0].format;
-        EXPECT_EQ(format.size(), tag == 1 ? 18u : 40u);
-        EXPECT_EQ(static_cast<unsigned char>(format[0]) | static_cast<unsigned char>(format[1]) << 8, tag);
-        EXPECT_EQ(format[12], channels * ((bits + 7) / 8));
-        if (tag != 1) {
-            EXPECT_EQ(format[18], bits);
-        }
+        EXPECT_EQ(leNumber(avi.streams[0].header, 32, 4), 100001u);
+        EXPECT_EQ(avi.streams[0].format, format);
     }
 }
 

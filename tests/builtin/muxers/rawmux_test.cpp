@@ -117,7 +117,7 @@ TEST_F(RawMuxing, V210) {
                 const QvFrame& source = pictures[i / height];
                 const auto* row = source.plane(0) + i % height * static_cast<size_t>(source.stride(0));
                 for (size_t k = 0; k < 2 * width; ++k) {
-                    const unsigned ten = leNumber(content, i * line + k / 3 * 4, 4) >> (k % 3 * 10) & 0x3FF;
+                    const auto ten = leNumber(content, i * line + k / 3 * 4, 4) >> (k % 3 * 10) & 0x3FF;
                     const unsigned char* sixteen = row + (k ^ 1) * 2;
                     ASSERT_NEAR(static_cast<int>(ten), (sixteen[0] | sixteen[1] << 8) >> 6, 1)
                         << "row " << i << " sample " << k;
