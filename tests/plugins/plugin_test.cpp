@@ -1,5 +1,4 @@
 // Plug-in files loaded by the shared library, as an application does it.
-#include <memory>
 
 #include "core/decode/decodefactory.h"
 #include "core/decode/qvdecoder.h"
@@ -16,8 +15,7 @@ namespace {
 
 namespace fs = std::filesystem;
 
-class Plugins : public testing::Test {
-  protected:
+struct Plugins : testing::Test {
     Plugins() {
         init_wrapper(nullptr);
         qv_dbg()->setLogger(&log);

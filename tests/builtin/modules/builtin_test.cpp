@@ -1,4 +1,3 @@
-#include <memory>
 #include <set>
 
 #include "builtin/modules.h"
@@ -9,8 +8,7 @@
 
 namespace {
 
-class Builtin : public testing::Test {
-  protected:
+struct Builtin : testing::Test {
     EngineScope engine;
     QvRegistry& registry = *qv_registry();
 };

@@ -8,8 +8,7 @@ namespace {
 
 namespace fs = std::filesystem;
 
-class Files : public testing::Test {
-  protected:
+struct Files : testing::Test {
     TempFolder temp;
     QvPlatform& platform = qv_platform();
 

@@ -6,8 +6,7 @@ namespace {
 
 namespace fs = std::filesystem;
 
-class Folders : public testing::Test {
-  protected:
+struct Folders : testing::Test {
     TempFolder temp;
     QvPlatform& platform = qv_platform();
 

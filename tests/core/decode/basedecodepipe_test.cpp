@@ -1,14 +1,11 @@
 #include "core/decode/basedecodepipe.h"
 
-#include <functional>
-
 #include "tests/core/decode/fake_decoder.h"
 #include "tests/support/checks.h"
 
 namespace {
 
-class Base : public testing::Test {
-  protected:
+struct Base : testing::Test {
     Base() {
         decoder.init();
         decoder.open();

@@ -39,8 +39,7 @@ class Events : public QvFileOpenCb {
     Texts all;
 };
 
-class Factory : public testing::Test {
-  protected:
+struct Factory : testing::Test {
     Factory() {
         first = new FakeModule("first", 1);
         second = new FakeModule("second", 2);

@@ -1,7 +1,6 @@
 #include "core/decode/qvaudiostreamreport.h"
 
 #include <cmath>
-#include <cstring>
 #include <limits>
 
 #include "core/media/qvbuffer.h"

@@ -5,8 +5,7 @@
 
 namespace {
 
-class Contract : public testing::Test {
-  protected:
+struct Contract : testing::Test {
     Contract() {
         decoder.init();
         decoder.setParam("filename", "a.mov");

@@ -1,9 +1,6 @@
 #include "core/decode/qvdecoderstate.h"
 
 #include <chrono>
-#include <filesystem>
-#include <fstream>
-#include <functional>
 #include <set>
 
 #include "tests/support/checks.h"
@@ -18,8 +15,7 @@ Any block(int bytes) {
     return Any(static_cast<const void*>(text.data()), bytes);
 }
 
-class DecoderState : public testing::Test {
-  protected:
+struct DecoderState : testing::Test {
     DecoderState()
         : file(folder.write("movie.mpg", "x").c_str()), manager("index", Any(folder.path().c_str())) {}
 

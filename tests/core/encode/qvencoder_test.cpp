@@ -1,6 +1,5 @@
 #include "core/encode/qvencoder.h"
 
-#include <climits>
 #include <map>
 
 #include "core/media/qvgeometry.h"

@@ -8,31 +8,28 @@ namespace {
 using qvpixels::Byte;
 
 template <class Sample>
+int weighed(const unsigned char* first, int a, const unsigned char* second, int b, size_t i) {
+    return sampleAt<Sample>(first, i) * a + sampleAt<Sample>(second, i) * b;
+}
+
+template <class Sample>
 void addRows(std::vector<LineKernel>& rows, LineSize size,
              void (*average)(Byte*, const Byte*, const Byte*, size_t),
              void (*mask)(Byte*, const Byte*, const Byte*, size_t),
              void (*mix)(Byte*, const Byte*, int, size_t)) {
-    rows.push_back(
-        {"average",
-         {size, size},
-         {size},
-         checked<Sample>(onLines(average),
-                         [](auto& l, size_t i) {
-                             return (sampleAt<Sample>(l.in[0], i) + sampleAt<Sample>(l.in[1], i)) >> 1;
-                         }),
-         true});
-    rows.push_back({"mask", {size, one}, {size}, checked<Sample>(onLines(mask), [](auto& l, size_t i) {
-                        const int weight = (l.in[1][i] + 1) >> 1;
-                        return (sampleAt<Sample>(l.out[0], i) * (128 - weight) +
-                                sampleAt<Sample>(l.in[0], i) * weight) >>
-                               7;
-                    })});
-    for (const int alpha : {0, 1, 127, 128, 254, 255})
-        rows.push_back({"mix", {size}, {size}, checked<Sample>(onLines(mix, alpha), [=](auto& l, size_t i) {
-                            return (sampleAt<Sample>(l.out[0], i) * (256 - alpha) +
-                                    sampleAt<Sample>(l.in[0], i) * alpha) >>
-                                   8;
-                        })});
+    const auto mean = [](auto& l, size_t i) { return weighed<Sample>(l.in[0], 1, l.in[1], 1, i) >> 1; };
+    const auto masked = [](auto& l, size_t i) {
+        const int weight = (l.in[1][i] + 1) >> 1;
+        return weighed<Sample>(l.out[0], 128 - weight, l.in[0], weight, i) >> 7;
+    };
+    rows.push_back({"average", {size, size}, {size}, checked<Sample>(onLines(average), mean), true});
+    rows.push_back({"mask", {size, one}, {size}, checked<Sample>(onLines(mask), masked)});
+    for (const int alpha : {0, 1, 127, 128, 254, 255}) {
+        const auto mixed = [=](auto& l, size_t i) {
+            return weighed<Sample>(l.out[0], 256 - alpha, l.in[0], alpha, i) >> 8;
+        };
+        rows.push_back({"mix", {size}, {size}, checked<Sample>(onLines(mix, alpha), mixed)});
+    }
 }
 
 }  // namespace
