@@ -1,6 +1,6 @@
 #include "builtin/sinks/qvfilebuiltins.h"
 
-#include "tests/support/checks.h"
+#include "tests/core/stream/streamtools.h"
 
 namespace {
 
@@ -10,14 +10,7 @@ struct FileOutput : testing::Test {
         sink_.setParam("filename", Any(name_.c_str()));
         sink_.setParam("bufsize", 1000);
     }
-    // As a multiplexer does: room first, then the bytes.
-    bool put(const std::string& text) {
-        auto* out = sink_.stream()->input();
-        auto* block = out->request(out, static_cast<unsigned>(text.size()));
-        if (!block) return false;
-        text.copy(reinterpret_cast<char*>(block), text.size());
-        return out->confirm(out, static_cast<unsigned>(text.size())) == text.size();
-    }
+    bool put(const char* text) { return ::put(sink_.stream()->input(), text); }
 
     TempFolder folder_;
     std::string name_ = folder_.file("out.bin");
