@@ -59,13 +59,9 @@ TYPED_TEST(FilterContract, CommonParametersAndState) {
     EXPECT_TRUE(log.contains("Invalid state dict, module name is other"));
 }
 
-TEST(FilterContract, Interfaces) {
+TEST(FilterContract, OfOneKindAlone) {
     PlainVideo video;
     PlainAudio audio;
-    for (const int kind : {0, 11, 12, 13}) {
-        EXPECT_EQ(video.getInterface(kind), kind == 12 ? &video : nullptr);
-        EXPECT_EQ(audio.getInterface(kind), kind == 13 ? &audio : nullptr);
-    }
     EXPECT_EQ(audio.setParam("vf_base", 1), 0);
     QvFrame frame;
     EXPECT_FALSE(video.QvVideoFilter::applySupported());
