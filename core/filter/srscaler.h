@@ -21,9 +21,10 @@
 //                                4:4:4
 //     B32F Y32F                  floats B, G, R, A from 0 to 1; floats V, U, Y, A, chroma from -0.5 to 0.5
 // Alpha is kept between formats that have it, but that of BGRA, R32A and VUYA only for a target of the same
-// format: any other sees these as BGR4, R32C and VUY4. It is dropped, not applied, and opaque where it is new.
-// Subsampled planes have width / factor by height / factor samples, rounded down. Chroma lies on the left
-// pixel of its pair, and in 4:2:0 between its two lines (of a field, if interlaced); of YVU9 in the middle.
+// format: any other sees these as BGR4, R32C and VUY4. It is dropped, not applied, and opaque where it is
+// new. Subsampled planes have width / factor by height / factor samples, rounded down. Chroma lies on the
+// left pixel of its pair, and in 4:2:0 between its two lines (of a field, if interlaced); of YVU9 in the
+// middle.
 #pragma once
 
 #include "core/arch/api.h"

@@ -190,7 +190,7 @@ TEST_F(Effects, AFilterThatFailsFailsTheJob) {
         {4, {"--filter", "rawdump:filename=x.avi", "-o", "x.avi"}, {"'x.avi'", "output"}},
         {4, {"--filter", "logo:filename=l.png", "-o", "l.png", "-y"}, {"'l.png'", "input"}},
         {1, toI422 + Words{"--filter", "timecode:_front=1", "-o", "x.raw"}, {"timecode", "I422"}},
-        {1, toI422 + Words{"--filter", "brightness:gamma=2,_front=1", "-o", "x.raw"}, {"in brightness filter"}},
+        {1, toI422 + Words{"--filter", "brightness:gamma=2,_front=1", "-o", "x.raw"}, {"brightness filter"}},
     };
     for (const auto& c : cases) fails(c.status, job + c.options, c.parts);
     makeYuv("clip.yuv", 2);
