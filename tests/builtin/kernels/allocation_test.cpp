@@ -1,15 +1,13 @@
 // A conversion that was met before takes no memory.
 #include <gtest/gtest.h>
 
-#include <cstring>
 #include <tuple>
 #include <vector>
 
 #include "builtin/pipes/qvvideopipe.h"
 #include "core/engine/qvregistry.h"
-#include "core/filter/srscaler.h"
-#include "core/media/fourcc.h"
 #include "core/media/qvframe.h"
+#include "tests/builtin/kernels/layouts.h"
 #include "tests/support/counted_memory.h"
 #include "tests/support/engine.h"
 
@@ -20,12 +18,9 @@ TEST(Memory, IsTakenForTheFirstPictureOnly) {
           {"BGR3", "v210", QvScale::high | QvScale::interlaced},
           {"YUYV", "I420", QvScale::standard | QvScale::source601 | QvScale::target709}}) {
         const auto run = [&](int count) {
-            unsigned a, b;
-            std::memcpy(&a, source, 4);
-            std::memcpy(&b, target, 4);
             for (int i = 0; i < count; ++i)
-                ASSERT_EQ(SRScaler(QvScale::oneThread, a, from.data(), 0, 64, 48, b, to.data(), 0, 96, 80, 0,
-                                   flags, nullptr),
+                ASSERT_EQ(SRScaler(QvScale::oneThread, codeOf(source), from.data(), 0, 64, 48, codeOf(target),
+                                   to.data(), 0, 96, 80, 0, flags, nullptr),
                           1);
         };
         run(2);
@@ -44,9 +39,7 @@ TEST(Memory, OfAChainOfFiltersIsTakenForTheFirstPicturesOnly) {
     }
     pipe.init();
     const auto size = [&](int at, const char* fourcc, int width, int height) {
-        pipe.filter(at)->setParam("outWidth", width);
-        pipe.filter(at)->setParam("outHeight", height);
-        pipe.filter(at)->setParam("FOURCC", fourcc);
+        pipe.filter(at)->setParamDict(AnyDict("outWidth", width, "outHeight", height, "FOURCC", fourcc));
     };
     size(0, "I420", 128, 96);
     pipe.filter(1)->setParam("contrast", 1.2);

@@ -239,8 +239,7 @@ TEST(Scaling, RampsStayInPlaceAtAnyRatio) {
                         for (int x = tw / 6; x < tw * 5 / 6; ++x) {
                             const double sx = (x + 0.5) * w / tw - 0.5, sy = (y + 0.5) * h / th - 0.5;
                             ASSERT_NEAR(to[static_cast<size_t>(y * tw + x)], 20 + 1.5 * sx + 0.5 * sy, 1.3)
-                                << tw << 'x' << th << " kind " << kind << " field " << field << " at " << x
-                                << ',' << y;
+                                << tw << 'x' << th << " kind " << (kind | field) << " at " << x << ',' << y;
                         }
                     for (int y = 0; y < th; ++y)
                         for (int x = 1; x < tw; ++x)
