@@ -158,10 +158,17 @@ TEST(Deep, LinesAreScaledAcrossAlikeAndNearTheExactSum) {
 TEST(Scale8, LinesOfBytesAreAddedUpAlike) {
     // Pairs of taps that lie half of the filter apart.
     const auto addedUp = [](const std::vector<int8_t>& weights) {
-        return [=](const LineCase& l) {
+        const size_t half = weights.size() / 2;
+        const auto run = [=](const LineCase& l) {
             const auto taps = static_cast<int>(weights.size());
             scaleDownBytes(l.in, weights.data(), taps, l.out[0], static_cast<int>(l.n));
         };
+        return checked<Byte>(run, [=](const LineCase& l, size_t i) {
+            int sum = 64;
+            for (size_t t = 0; t < half; ++t)
+                sum += weights[2 * t] * l.in[t][i] + weights[2 * t + 1] * l.in[t + half][i];
+            return std::clamp(sum >> 7, 0, 255);
+        });
     };
     const LineKernel kernels[] = {
         {"2 lines", {one, one}, {one}, addedUp({50, 78})},
