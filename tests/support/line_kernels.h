@@ -80,45 +80,37 @@ auto checked(Run run, Formula formula) {
     };
 }
 
-class UnitRunner {
-  public:
-    // What is in the lines behind a run.
-    std::string run(const LineKernel& kernel, size_t n, size_t gap, bool inPlace, int64_t target) {
-        LineCase lines{{}, {}, n};
-        for (unsigned i = 0; i < 12; ++i) {
-            const LineSize& size = i < 8 ? kernel.in[i] : kernel.out[i - 8];
-            unsigned char* const line =
-                memory_[i].place(size.of(n), gap * size.align, i + static_cast<unsigned>(n));
-            if (size.times)
-                (i < 8 ? lines.in[i] : lines.out[i - 8]) = i < 8 || !inPlace ? line : lines.in[i - 8];
-        }
-        {
-            const OnTarget only(target);
-            kernel.run(lines);
-        }
-        std::string result;
-        for (const Guarded& memory : memory_)
-            result += memory.intact() ? memory.bytes() : "written beside the line";
-        return result;
+// What is in the lines behind a run.
+inline std::string linesBehind(const LineKernel& kernel, size_t n, size_t gap, bool inPlace, int64_t target) {
+    static Guarded memory[12];
+    LineCase lines{{}, {}, n};
+    for (unsigned i = 0; i < 12; ++i) {
+        const LineSize& size = i < 8 ? kernel.in[i] : kernel.out[i - 8];
+        unsigned char* const line =
+            memory[i].place(size.of(n), gap * size.align, i + static_cast<unsigned>(n));
+        if (size.times) (i < 8 ? lines.in[i] : lines.out[i - 8]) = i < 8 || !inPlace ? line : lines.in[i - 8];
     }
-
-  private:
-    Guarded memory_[12];
-};
+    {
+        const OnTarget only(target);
+        kernel.run(lines);
+    }
+    std::string result;
+    for (const Guarded& line : memory) result += line.intact() ? line.bytes() : "written beside the line";
+    return result;
+}
 
 // Widths 1 to 129, and every distance from the end of the memory up to a vector.
 inline void compareUnits(std::span<const LineKernel> kernels,
                          const std::vector<int64_t>& targets = machineTargets()) {
-    UnitRunner runner;
     for (const auto& kernel : kernels)
         for (size_t n = 1; n <= 129; ++n)
             for (size_t gap = 0; gap < 32; ++gap)
                 for (const bool inPlace : {false, true}) {
                     if (inPlace && !kernel.inPlace) continue;
-                    const std::string expected = runner.run(kernel, n, gap, inPlace, HWY_STATIC_TARGET);
+                    const std::string expected = linesBehind(kernel, n, gap, inPlace, HWY_STATIC_TARGET);
                     ASSERT_EQ(expected.find("written beside"), std::string::npos) << kernel.name;
                     for (const auto target : targets)
-                        ASSERT_TRUE(runner.run(kernel, n, gap, inPlace, target) == expected)
+                        ASSERT_TRUE(linesBehind(kernel, n, gap, inPlace, target) == expected)
                             << kernel.name << ' ' << n << (inPlace ? " in place" : "") << " at " << gap
                             << " on " << hwy::TargetName(target);
                 }
