@@ -17,6 +17,7 @@ void* counted(std::size_t bytes, std::size_t align) {
 }  // namespace
 
 void* operator new(std::size_t bytes) { return counted(bytes, 16); }
+void* operator new(std::size_t bytes, const std::nothrow_t&) noexcept { return counted(bytes, 16); }
 void* operator new(std::size_t bytes, std::align_val_t align) {
     return counted(bytes, static_cast<std::size_t>(align));
 }

@@ -109,6 +109,7 @@ inline void compareUnits(std::span<const LineKernel> kernels,
                     if (inPlace && !kernel.inPlace) continue;
                     const std::string expected = linesBehind(kernel, n, gap, inPlace, HWY_STATIC_TARGET);
                     ASSERT_EQ(expected.find("written beside"), std::string::npos) << kernel.name;
+                    ASSERT_FALSE(testing::Test::HasFailure()) << kernel.name << ' ' << n << " at " << gap;
                     for (const auto target : targets)
                         ASSERT_TRUE(linesBehind(kernel, n, gap, inPlace, target) == expected)
                             << kernel.name << ' ' << n << (inPlace ? " in place" : "") << " at " << gap
