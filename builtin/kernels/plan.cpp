@@ -176,6 +176,12 @@ bool scales(const Request& request) {
 Plan::Plan() = default;
 Plan::~Plan() = default;
 
+void Plan::provideWorkspaces(int threads) const {
+    const std::lock_guard guard(lock_);
+    const auto wanted = std::min(static_cast<size_t>(threads), idle_.capacity());
+    while (idle_.size() < wanted) idle_.push_back(std::make_unique<Workspace>(*this));
+}
+
 std::unique_ptr<Workspace> Plan::takeWorkspace() const {
     {
         const std::lock_guard guard(lock_);

@@ -67,6 +67,8 @@ struct Plan {
     int workWidth = 0;   // samples of the widest line in work
 
     // Memory of the bands that are at work, kept between pictures.
+    // Makes what so many threads take at once, so that none of them has to later.
+    void provideWorkspaces(int threads) const;
     std::unique_ptr<Workspace> takeWorkspace() const;
     void giveBack(std::unique_ptr<Workspace> workspace) const noexcept;
     void keepWorkspaces();  // makes room for those that come back
@@ -77,7 +79,7 @@ struct Plan {
     Plan& operator=(const Plan&) = delete;
 
   private:
-    static constexpr size_t mostKept = 16;  // as many as a picture has bands
+    static constexpr size_t mostKept = 16;  // as many threads as share a picture
 
     mutable std::mutex lock_;
     mutable std::vector<std::unique_ptr<Workspace>> idle_;

@@ -165,9 +165,12 @@ BandRange bandRange(const Plan& plan, int bands, int band) {
     return {field, first, index == perField - 1 ? lines : std::min(first + height, lines)};
 }
 
-int bandCount(unsigned mode, const Plan& plan) {
-    const int threads = std::min(qvThreadPool().width(), mostThreads);
-    int bands = mode & QvScale::oneThread ? 1 : bandsPerThread * threads;
+int threadCount(unsigned mode) {
+    return mode & QvScale::oneThread ? 1 : std::min(qvThreadPool().width(), mostThreads);
+}
+
+int bandCount(int threads, const Plan& plan) {
+    int bands = threads == 1 ? 1 : bandsPerThread * threads;
     bands = std::clamp((plan.request.height + 4) / leastBandLines, 1, bands);
     return plan.fields == 2 ? std::max(2, (bands + 1) / 2 * 2) : bands;
 }
@@ -187,14 +190,16 @@ class Borrowed {
 };
 
 void run(unsigned mode, const Plan& plan, const Picture& source, const Picture& target) {
-    const int bands = bandCount(mode, plan);
+    const int threads = threadCount(mode);
+    const int bands = bandCount(threads, plan);
+    plan.provideWorkspaces(std::min(threads, bands));
     const auto work = [&](int band) {
         const auto range = bandRange(plan, bands, band);
         if (range.first >= range.last) return;
         Borrowed workspace(plan);
         runBand(plan, workspace.get(), source, target, range.field, range.first, range.last);
     };
-    if (mode & QvScale::oneThread)
+    if (threads == 1)
         for (int band = 0; band < bands; ++band) work(band);
     else
         qvThreadPool().parallelFor(bands, work);
