@@ -7,7 +7,7 @@
 class AviBytes {
   public:
     AviBytes& text(const char (&fourLetters)[5]) {
-        data_.insert(data_.end(), fourLetters, fourLetters + 4);
+        for (int i = 0; i < 4; ++i) data_.push_back(static_cast<unsigned char>(fourLetters[i]));
         return *this;
     }
     AviBytes& u16(int64_t value) { return number(value, 2); }

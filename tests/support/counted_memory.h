@@ -16,12 +16,15 @@ void* counted(std::size_t bytes, std::size_t align) {
 }
 }  // namespace
 
-void* operator new(std::size_t bytes) { return counted(bytes, 16); }
-void* operator new(std::size_t bytes, const std::nothrow_t&) noexcept { return counted(bytes, 16); }
-void* operator new(std::size_t bytes, std::align_val_t align) {
+// Apart, or the compiler sees through one of a pair and takes the other for a mismatch.
+#define QV_APART [[gnu::noinline]]
+QV_APART void* operator new(std::size_t bytes) { return counted(bytes, 16); }
+QV_APART void* operator new(std::size_t bytes, const std::nothrow_t&) noexcept { return counted(bytes, 16); }
+QV_APART void* operator new(std::size_t bytes, std::align_val_t align) {
     return counted(bytes, static_cast<std::size_t>(align));
 }
-void operator delete(void* memory) noexcept { std::free(memory); }
-void operator delete(void* memory, std::size_t) noexcept { std::free(memory); }
-void operator delete(void* memory, std::align_val_t) noexcept { std::free(memory); }
-void operator delete(void* memory, std::size_t, std::align_val_t) noexcept { std::free(memory); }
+QV_APART void operator delete(void* memory) noexcept { std::free(memory); }
+QV_APART void operator delete(void* memory, std::size_t) noexcept { std::free(memory); }
+QV_APART void operator delete(void* memory, std::align_val_t) noexcept { std::free(memory); }
+QV_APART void operator delete(void* memory, std::size_t, std::align_val_t) noexcept { std::free(memory); }
+#undef QV_APART
