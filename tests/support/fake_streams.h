@@ -218,6 +218,7 @@ class FakeEncodePipe : public EncodePipe2 {
         return audios.at(static_cast<std::size_t>(nr)).get();
     }
     QvMuxer* getMuxer() const override { return muxer; }
+    const QvPreset* activePreset() const override { return nullptr; }
 
     FakeVideoEncoder video;
     std::vector<std::unique_ptr<FakeAudioEncoder>> audios;
