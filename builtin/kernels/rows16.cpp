@@ -18,16 +18,6 @@ namespace HWY_NAMESPACE {
 
 constexpr uint16_t opaque = 65535, neutral = 32768;
 
-HWY_INLINE uint16_t wordAt(const Byte* from, size_t i) {
-    static_assert(std::endian::native == std::endian::little, "words of memory are read as they stand");
-    uint16_t word;
-    std::memcpy(&word, from + 2 * i, 2);
-    return word;
-}
-HWY_INLINE void putWord(Byte* to, size_t i, unsigned value) {
-    const auto word = static_cast<uint16_t>(value);
-    std::memcpy(to + 2 * i, &word, 2);
-}
 HWY_INLINE uint32_t doubleAt(const Byte* from, size_t i) {
     uint32_t word;
     std::memcpy(&word, from + 4 * i, 4);
@@ -418,10 +408,6 @@ HWY_AFTER_NAMESPACE();
 
 #if HWY_ONCE
 namespace srk {
-
-#define QV_KERNEL(name, parameters, arguments) \
-    HWY_EXPORT(name);                          \
-    void name parameters { HWY_DYNAMIC_DISPATCH(name) arguments; }  // NOLINT(bugprone-macro-parentheses)
 
 QV_KERNEL(splitWords4, (const Byte* from, uint16_t* a, uint16_t* b, uint16_t* c, uint16_t* d, size_t n),
           (from, a, b, c, d, n))

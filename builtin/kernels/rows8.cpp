@@ -499,11 +499,6 @@ HWY_AFTER_NAMESPACE();
 #if HWY_ONCE
 namespace srk {
 
-// One line a kernel: exported by name, called through the table of the machine's units.
-#define QV_KERNEL(name, parameters, arguments) \
-    HWY_EXPORT(name);                          \
-    void name parameters { HWY_DYNAMIC_DISPATCH(name) arguments; }  // NOLINT(bugprone-macro-parentheses)
-
 QV_KERNEL(split4, (const Byte* from, Byte* a, Byte* b, Byte* c, Byte* d, size_t n), (from, a, b, c, d, n))
 QV_KERNEL(join4, (Byte * to, const Byte* a, const Byte* b, const Byte* c, const Byte* d, size_t n),
           (to, a, b, c, d, n))

@@ -14,17 +14,6 @@ HWY_BEFORE_NAMESPACE();
 namespace srk {
 namespace HWY_NAMESPACE {
 
-HWY_INLINE uint16_t wordAt(const Byte* row, size_t i) {
-    uint16_t word;
-    std::memcpy(&word, row + 2 * i, 2);
-    return word;
-}
-
-HWY_INLINE void putWord(Byte* row, size_t i, uint32_t value) {
-    const auto word = static_cast<uint16_t>(value);
-    std::memcpy(row + 2 * i, &word, 2);
-}
-
 void weighBytes(Byte* dst, const Byte* src, const uint16_t* scale, const uint16_t* add, size_t bytes) {
     size_t i = 0;
 #if QV_VECTORS

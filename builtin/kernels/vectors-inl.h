@@ -1,5 +1,17 @@
 // What the vector kernels share, compiled once for each vector unit: include inside the foreach_target file
 // after <hwy/highway.h>.
+
+#ifndef QV_KERNEL
+#include <bit>
+#include <cstdint>
+#include <cstring>
+
+// One line a kernel: exported by name, called through the table of the machine's units.
+#define QV_KERNEL(name, parameters, arguments) \
+    HWY_EXPORT(name);                          \
+    void name parameters { HWY_DYNAMIC_DISPATCH(name) arguments; }  // NOLINT(bugprone-macro-parentheses)
+#endif
+
 #if defined(QV_KERNEL_VECTORS_INL) == defined(HWY_TARGET_TOGGLE)
 #ifdef QV_KERNEL_VECTORS_INL
 #undef QV_KERNEL_VECTORS_INL
@@ -19,6 +31,18 @@ HWY_BEFORE_NAMESPACE();
 namespace srk {
 namespace HWY_NAMESPACE {
 namespace hn = hwy::HWY_NAMESPACE;
+
+// Words at any address, in the order of memory.
+HWY_INLINE uint16_t wordAt(const Byte* from, size_t i) {
+    static_assert(std::endian::native == std::endian::little, "words of memory are read as they stand");
+    uint16_t word;
+    std::memcpy(&word, from + 2 * i, 2);
+    return word;
+}
+HWY_INLINE void putWord(Byte* to, size_t i, unsigned value) {
+    const auto word = static_cast<uint16_t>(value);
+    std::memcpy(to + 2 * i, &word, 2);
+}
 
 #if QV_VECTORS
 
