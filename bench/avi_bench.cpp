@@ -12,9 +12,9 @@
 
 #include "bench/ratio.h"
 #include "core/encode/qvencodepipe.h"
-#include "core/engine/init.h"
+#include "core/engine/modules/init.h"
 #include "core/preset/qvprofile.h"
-#include "core/transcode/pushencoder.h"
+#include "core/transcode/push/pushencoder.h"
 #include "tests/support/pictures.h"
 #include "tests/support/temp_folder.h"
 

@@ -16,8 +16,8 @@
 
 #include "core/decode/qvdecoder.h"
 #include "core/decode/qvtestgenerator.h"
-#include "core/engine/init.h"
-#include "core/engine/qvregistry.h"
+#include "core/engine/modules/init.h"
+#include "core/engine/modules/qvregistry.h"
 #include "core/media/qvbuffer.h"
 
 namespace {

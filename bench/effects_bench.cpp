@@ -4,11 +4,11 @@
 #include <string>
 
 #include "bench/ratio.h"
-#include "core/engine/init.h"
-#include "core/engine/qvregistry.h"
+#include "core/engine/modules/init.h"
+#include "core/engine/modules/qvregistry.h"
 #include "core/filter/qvfilter.h"
+#include "core/image/qvimage.h"
 #include "core/media/qvframe.h"
-#include "core/media/qvimage.h"
 
 namespace {
 

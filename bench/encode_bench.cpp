@@ -16,7 +16,7 @@
 #include <vector>
 
 #include "core/encode/qvencodepipe.h"
-#include "core/engine/init.h"
+#include "core/engine/modules/init.h"
 #include "core/media/qvbuffer.h"
 
 namespace {

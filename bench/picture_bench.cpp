@@ -11,10 +11,10 @@
 #include <vector>
 
 #include "bench/ratio.h"
-#include "builtin/kernels/formats.h"
-#include "core/engine/qvthreadpool.h"
+#include "builtin/kernels/formats/formats.h"
+#include "core/engine/threads/qvthreadpool.h"
 #include "core/filter/srscaler.h"
-#include "core/media/fourcc.h"
+#include "core/measure/fourcc.h"
 
 #ifdef QV_HAVE_LIBYUV
 #include <libyuv.h>

@@ -4,8 +4,8 @@
 #include <vector>
 
 #include "bench/ratio.h"
-#include "builtin/video/qvbobber.h"
-#include "builtin/video/qvframerateconvert.h"
+#include "builtin/video/frames/qvbobber.h"
+#include "builtin/video/frames/qvframerateconvert.h"
 
 namespace {
 

@@ -9,10 +9,10 @@
 #include <unistd.h>
 
 #include "bench/ratio.h"
+#include "core/split/qvbufstreamsplit.h"
+#include "core/stream/fifo/qvbuffifo.h"
+#include "core/stream/file/qvfilebufstream.h"
 #include "core/stream/platformblock_p.h"
-#include "core/stream/qvbuffifo.h"
-#include "core/stream/qvbufstreamsplit.h"
-#include "core/stream/qvfilebufstream.h"
 #include "tests/support/temp_folder.h"
 
 namespace {

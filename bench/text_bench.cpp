@@ -5,13 +5,13 @@
 #include <vector>
 
 #include "bench/ratio.h"
-#include "core/caption/qvsubtitlerender.h"
-#include "core/caption/qvsubtitles.h"
-#include "core/caption/qvtextrenderingoptions.h"
+#include "core/caption/subtitle/qvsubtitlerender.h"
+#include "core/caption/subtitle/qvsubtitles.h"
+#include "core/caption/text/qvtextrenderingoptions.h"
 #include "core/decode/qvdecoder.h"
 #include "core/decode/qvtestgenerator.h"
-#include "core/engine/init.h"
-#include "core/engine/qvregistry.h"
+#include "core/engine/modules/init.h"
+#include "core/engine/modules/qvregistry.h"
 #include "core/media/qvbuffer.h"
 
 namespace {

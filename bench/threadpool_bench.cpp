@@ -5,7 +5,7 @@
 #include <thread>
 #include <vector>
 
-#include "core/engine/qvthreadpool.h"
+#include "core/engine/threads/qvthreadpool.h"
 
 namespace {
 

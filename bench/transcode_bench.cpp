@@ -13,12 +13,12 @@
 #include "core/decode/decodefactory.h"
 #include "core/decode/qvdecoder.h"
 #include "core/encode/qvencodepipe.h"
-#include "core/engine/init.h"
-#include "core/engine/qvregistry.h"
-#include "core/media/fourcc.h"
+#include "core/engine/modules/init.h"
+#include "core/engine/modules/qvregistry.h"
+#include "core/measure/fourcc.h"
 #include "core/media/qvbuffer.h"
 #include "core/preset/qvpresetmgr.h"
-#include "core/transcode/qvtranscoder.h"
+#include "core/transcode/run/qvtranscoder.h"
 #include "tests/support/temp_folder.h"
 
 namespace {

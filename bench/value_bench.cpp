@@ -20,8 +20,8 @@
 #include <time.h>
 #include <unistd.h>
 
-#include "core/media/qvgeometry.h"
-#include "core/value/xmldom.h"
+#include "core/document/xmldom.h"
+#include "core/measure/qvgeometry.h"
 
 namespace {
 

@@ -5,10 +5,10 @@
 
 #include "builtin/builtinmodule.h"
 #include "builtin/creators.h"
-#include "core/caption/qvsubtitlefilter.h"
-#include "core/engine/builtinplugin_p.h"
-#include "core/engine/qvplugin.h"
-#include "core/value/qvassert.h"
+#include "core/arch/qvassert.h"
+#include "core/caption/subtitle/qvsubtitlefilter.h"
+#include "core/engine/modules/builtinplugin_p.h"
+#include "core/engine/modules/qvplugin.h"
 
 namespace {
 

@@ -5,7 +5,7 @@
 #include <string_view>
 #include <vector>
 
-#include "core/engine/qvcodec.h"
+#include "core/engine/modules/qvcodec.h"
 
 namespace {
 

@@ -1,7 +1,7 @@
 // The module class of everything built in: a row of the table in builtin.cpp brought to life.
 #pragma once
 
-#include "core/engine/qvmodule.h"
+#include "core/engine/modules/qvmodule.h"
 
 // Further attributes of a module. Lists are words between blanks.
 struct QvBuiltinAttributes {

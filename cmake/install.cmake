@@ -8,6 +8,15 @@ install(TARGETS qvplugcore EXPORT qvplugcore-targets LIBRARY DESTINATION ${CMAKE
 install(DIRECTORY ${CMAKE_SOURCE_DIR}/core DESTINATION ${QV_INCLUDE_ROOT}
         FILES_MATCHING PATTERN "*.h" PATTERN "posix" EXCLUDE PATTERN "*_p.h" EXCLUDE)
 install(FILES ${CMAKE_BINARY_DIR}/include/qvplugcore/qvplugcore.h DESTINATION ${QV_INCLUDE_ROOT})
+
+# A header that has moved is still found under its former name.
+file(STRINGS ${CMAKE_SOURCE_DIR}/cmake/formerheaders.txt QV_FORMER_HEADERS REGEX "^core/")
+foreach(row ${QV_FORMER_HEADERS})
+  string(REGEX MATCH "^([^ ]+) +([^ ]+)$" row "${row}")
+  file(CONFIGURE OUTPUT ${CMAKE_BINARY_DIR}/former/${CMAKE_MATCH_1}
+       CONTENT "// Its place is ${CMAKE_MATCH_2} now.\n#pragma once\n\n#include \"${CMAKE_MATCH_2}\"\n")
+endforeach()
+install(DIRECTORY ${CMAKE_BINARY_DIR}/former/core DESTINATION ${QV_INCLUDE_ROOT})
 install(EXPORT qvplugcore-targets DESTINATION ${CMAKE_INSTALL_LIBDIR}/cmake/qvplugcore)
 
 file(WRITE ${CMAKE_BINARY_DIR}/qvplugcore-config.cmake

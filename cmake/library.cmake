@@ -13,10 +13,12 @@ target_link_libraries(qv_objects PUBLIC
   PkgConfig::FONTCONFIG PkgConfig::HARFBUZZ PkgConfig::FRIBIDI PkgConfig::CRYPTOPP PkgConfig::HWY
   ${CMAKE_DL_LIBS})
 
-# <qvplugcore/qvplugcore.h> includes every public header, room by room.
+# <qvplugcore/qvplugcore.h> includes every public header, room by room from the ground up.
+file(STRINGS ${CMAKE_SOURCE_DIR}/tests/lint/rooms.txt QV_ROOMS REGEX "^ *[0-9]+ +core/")
 set(QV_UMBRELLA "// The whole public interface of the engine.\n#pragma once\n\n")
-foreach(room arch value engine media stream decode encode filter transcode batch caption preset compose)
-  file(GLOB headers RELATIVE ${CMAKE_SOURCE_DIR} CONFIGURE_DEPENDS ${CMAKE_SOURCE_DIR}/core/${room}/*.h)
+foreach(room ${QV_ROOMS})
+  string(REGEX REPLACE "^ *[0-9]+ +([^ ]+).*" "\\1" room "${room}")
+  file(GLOB headers RELATIVE ${CMAKE_SOURCE_DIR} CONFIGURE_DEPENDS ${CMAKE_SOURCE_DIR}/${room}/*.h)
   list(FILTER headers EXCLUDE REGEX "_p\\.h$")
   foreach(header ${headers})
     string(APPEND QV_UMBRELLA "#include \"${header}\"\n")

@@ -15,11 +15,11 @@
 #include <qvplugcore/qvplugcore.h>
 #include <CLI/CLI.hpp>
 
-#include "commands.h"
-#include "console.h"
-#include "failure.h"
-#include "outputs.h"
-#include "signals.h"
+#include "tarsel/commands/commands.h"
+#include "tarsel/host/console.h"
+#include "tarsel/host/outputs.h"
+#include "tarsel/host/signals.h"
+#include "tarsel/words/failure.h"
 
 namespace {
 

@@ -4,9 +4,9 @@
 #include <cstring>
 #include <memory>
 
+#include "core/arch/qvassert.h"
 #include "core/engine/status.h"
 #include "core/media/qvsoundbytes.h"
-#include "core/value/qvassert.h"
 
 int SoundLoop::init(const QvPcm& sound, int length, long long total) {
     *this = SoundLoop();

@@ -1,7 +1,7 @@
 // What the streams of the test generator have in common.
 #pragma once
 
-#include "core/media/qvgeometry.h"
+#include "core/measure/qvgeometry.h"
 #include "core/value/anycontainer.h"
 
 class GeneratorStream {

@@ -1,6 +1,6 @@
 #include "builtin/decoders/inputfile.h"
 
-#include "core/engine/qvfileutil.h"
+#include "core/engine/files/qvfileutil.h"
 #include "core/engine/status.h"
 #include "core/value/any.h"
 

@@ -6,12 +6,12 @@
 #include <utility>
 
 #include "builtin/creators.h"
-#include "core/engine/params.h"
-#include "core/engine/qvmodule.h"
-#include "core/engine/qvregistry.h"
+#include "core/arch/qvassert.h"
+#include "core/engine/modules/params.h"
+#include "core/engine/modules/qvmodule.h"
+#include "core/engine/modules/qvregistry.h"
 #include "core/engine/status.h"
 #include "core/filter/qvfilter.h"
-#include "core/value/qvassert.h"
 
 namespace {
 

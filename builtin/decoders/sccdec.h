@@ -23,7 +23,7 @@
 
 #include <array>
 
-#include "core/caption/qvcc.h"
+#include "core/caption/cc/qvcc.h"
 #include "core/decode/basedecodepipe.h"
 
 class CCStream : public DPipeStream {

@@ -6,11 +6,11 @@
 #include <string>
 
 #include "builtin/creators.h"
-#include "core/engine/params.h"
-#include "core/engine/qvfileutil.h"
-#include "core/engine/qvlog.h"
+#include "core/arch/qvassert.h"
+#include "core/engine/files/qvfileutil.h"
+#include "core/engine/log/qvlog.h"
+#include "core/engine/modules/params.h"
 #include "core/engine/status.h"
-#include "core/value/qvassert.h"
 
 namespace {
 

@@ -17,7 +17,7 @@
 
 #include <optional>
 
-#include "core/caption/qvsubtitles.h"
+#include "core/caption/subtitle/qvsubtitles.h"
 #include "core/decode/basedecodepipe.h"
 
 class SubImporter : public BaseDecodePipe {

@@ -8,12 +8,12 @@
 #include <numbers>
 #include <string>
 
-#include "core/engine/qvnum.h"
+#include "core/arch/qvassert.h"
+#include "core/measure/qvgeometry.h"
+#include "core/measure/qvnum.h"
 #include "core/media/qvbuffer.h"
 #include "core/media/qvdraw.h"
-#include "core/media/qvgeometry.h"
 #include "core/value/any.h"
-#include "core/value/qvassert.h"
 
 namespace {
 

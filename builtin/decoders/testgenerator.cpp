@@ -6,8 +6,8 @@
 #include <new>
 
 #include "builtin/creators.h"
+#include "core/arch/qvassert.h"
 #include "core/engine/status.h"
-#include "core/value/qvassert.h"
 
 namespace {
 

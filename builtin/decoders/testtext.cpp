@@ -1,9 +1,9 @@
 #include "builtin/decoders/testtext.h"
 
-#include "core/caption/qvsubtitlerender.h"
-#include "core/caption/qvsubtitles.h"
-#include "core/caption/qvtextrenderingoptions.h"
-#include "core/engine/qvregistry.h"
+#include "core/caption/subtitle/qvsubtitlerender.h"
+#include "core/caption/subtitle/qvsubtitles.h"
+#include "core/caption/text/qvtextrenderingoptions.h"
+#include "core/engine/modules/qvregistry.h"
 #include "core/engine/status.h"
 
 namespace {

@@ -6,10 +6,10 @@
 #include <new>
 
 #include "builtin/decoders/testtext.h"
+#include "core/arch/qvassert.h"
 #include "core/engine/status.h"
-#include "core/media/qvimage.h"
+#include "core/image/qvimage.h"
 #include "core/value/ptrlist.h"
-#include "core/value/qvassert.h"
 
 namespace {
 

@@ -6,9 +6,9 @@
 #include <utility>
 
 #include "builtin/creators.h"
+#include "core/arch/qvassert.h"
 #include "core/engine/status.h"
 #include "core/media/qvbuffer.h"
-#include "core/value/qvassert.h"
 
 namespace {
 

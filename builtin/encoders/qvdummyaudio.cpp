@@ -1,10 +1,10 @@
 #include "builtin/encoders/qvdummyaudio.h"
 
 #include "builtin/creators.h"
-#include "builtin/encoders/muxerof.h"
+#include "builtin/shared/muxerof.h"
+#include "core/arch/qvassert.h"
 #include "core/media/qvbuffer.h"
 #include "core/stream/qvbufstrm.h"
-#include "core/value/qvassert.h"
 
 int DummyAudioEnc::setParam(const char* name, const Any& value) {
     _traceParam(name, value);

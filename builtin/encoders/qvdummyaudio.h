@@ -2,7 +2,7 @@
 #pragma once
 
 #include "core/encode/qvencoder.h"
-#include "core/engine/qvmodule.h"
+#include "core/engine/modules/qvmodule.h"
 #include "core/value/anycontainer.h"
 
 class QvMuxer;

@@ -3,14 +3,14 @@
 #include <algorithm>
 
 #include "builtin/creators.h"
-#include "builtin/encoders/muxerof.h"
-#include "builtin/encoders/rawoutput.h"
-#include "core/engine/qvexception.h"
-#include "core/engine/qvlog.h"
+#include "builtin/shared/muxerof.h"
+#include "builtin/shared/rawoutput.h"
+#include "core/arch/qvassert.h"
+#include "core/arch/qvexception.h"
+#include "core/engine/log/qvlog.h"
 #include "core/media/qvbuffer.h"
 #include "core/stream/auxinfoid.h"
 #include "core/stream/qvbufstrm.h"
-#include "core/value/qvassert.h"
 
 namespace {
 

@@ -4,7 +4,7 @@
 #include <cstdint>
 
 #include "core/encode/qvencoder.h"
-#include "core/engine/qvmodule.h"
+#include "core/engine/modules/qvmodule.h"
 
 // Samples go to the output as they lie in the buffer: interleaved, little-endian, (bits + 7) / 8 bytes a
 // value, 8 bits unsigned. With the multiplexers "rawmux" and "memmux" each writePcm is announced as an access

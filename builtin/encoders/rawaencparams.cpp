@@ -3,9 +3,9 @@
 
 #include "builtin/encoders/rawaenc.h"
 #include "builtin/encoders/rawsettings.h"
+#include "core/arch/qvassert.h"
 #include "core/engine/qvutil.h"
-#include "core/media/qvgeometry.h"
-#include "core/value/qvassert.h"
+#include "core/measure/qvgeometry.h"
 
 namespace {
 

@@ -5,8 +5,8 @@
 #include <algorithm>
 #include <climits>
 
-#include "core/engine/params.h"
-#include "core/media/bitrate.h"
+#include "core/engine/modules/params.h"
+#include "core/measure/bitrate.h"
 
 namespace rawsettings {
 

@@ -7,15 +7,16 @@
 #include <mutex>
 
 #include "builtin/creators.h"
-#include "builtin/encoders/rawoutput.h"
 #include "builtin/encoders/rawvencformats.h"
-#include "core/engine/qvexception.h"
-#include "core/engine/qvlog.h"
-#include "core/engine/qvregistry.h"
+#include "builtin/shared/rawoutput.h"
+#include "core/arch/platform.h"
+#include "core/arch/qvassert.h"
+#include "core/arch/qvexception.h"
+#include "core/engine/log/qvlog.h"
+#include "core/engine/modules/qvregistry.h"
 #include "core/filter/qvfilter.h"
 #include "core/stream/auxinfoid.h"
 #include "core/stream/qvbufstrm.h"
-#include "core/value/qvassert.h"
 
 namespace {
 
@@ -93,11 +94,10 @@ int RawVideoEnc::open() {
     if (accelerated_) {
         if (const int result = queue_.init(queuedFrames)) return setError(result, "Out of memory");
         stop_ = discard_ = false;
-        try {
-            worker_ = std::thread(&RawVideoEnc::work, this);
-        } catch (const std::exception& error) {  // no thread, or no memory for one
+        worker_ = qv_platform().startThread([this] { work(); });
+        if (!worker_.joinable()) {
             queue_.destroy();
-            return setError(QvStatus::failed, "Can not start the writing thread: %s", error.what());
+            return setError(QvStatus::failed, "Can not start the writing thread");
         }
     }
     setState(qvStateOpen);

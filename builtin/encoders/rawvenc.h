@@ -7,10 +7,10 @@
 #include <thread>
 
 #include "core/encode/qvencoder.h"
-#include "core/engine/qvmodule.h"
+#include "core/engine/modules/qvmodule.h"
+#include "core/measure/qvgeometry.h"
 #include "core/media/frameque.h"
 #include "core/media/qvbuffer.h"
-#include "core/media/qvgeometry.h"
 
 class QvVideoFilter;
 

@@ -1,7 +1,7 @@
 #include "builtin/encoders/rawvencformats.h"
 
-#include "core/media/fourcc.h"
-#include "core/media/qvgeometry.h"
+#include "core/measure/fourcc.h"
+#include "core/measure/qvgeometry.h"
 
 namespace rawvenc {
 

@@ -4,7 +4,7 @@
 #include "builtin/encoders/rawsettings.h"
 #include "builtin/encoders/rawvenc.h"
 #include "builtin/encoders/rawvencformats.h"
-#include "core/value/qvassert.h"
+#include "core/arch/qvassert.h"
 
 struct RawVideoParams {
     using Enc = RawVideoEnc;

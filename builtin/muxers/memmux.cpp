@@ -3,8 +3,8 @@
 #include <algorithm>
 
 #include "builtin/creators.h"
-#include "core/stream/qvbufmem.h"
-#include "core/value/qvassert.h"
+#include "core/arch/qvassert.h"
+#include "core/stream/fifo/qvbufmem.h"
 
 QvBufStream* MemMux::addStream(int type, const AnyDict& params) {
     if (getState() != stateInitialised) {

@@ -3,9 +3,9 @@
 #include <cstring>
 
 #include "builtin/creators.h"
-#include "core/engine/qvlog.h"
-#include "core/stream/qvfilebufstream.h"
-#include "core/value/qvassert.h"
+#include "core/arch/qvassert.h"
+#include "core/engine/log/qvlog.h"
+#include "core/stream/file/qvfilebufstream.h"
 
 void NullMux::getParam(const char* name, Any& value) const {
     if (std::strcmp(name, "maxStreams") == 0)

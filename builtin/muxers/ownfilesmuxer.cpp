@@ -1,6 +1,6 @@
 #include "builtin/muxers/ownfilesmuxer.h"
 
-#include "builtin/sinks/qvfilebuiltins.h"
+#include "builtin/shared/donothing.h"
 
 int OwnFilesMuxer::attachOutStream(QvBufStream* stream) {
     if (const int result = BaseMuxer::attachOutStream(stream)) return result;

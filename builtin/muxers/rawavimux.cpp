@@ -3,10 +3,10 @@
 #include "builtin/creators.h"
 #include "builtin/muxers/rawavimuxbytes.h"
 #include "builtin/muxers/streamcodec.h"
-#include "core/media/fourcc.h"
-#include "core/media/qvgeometry.h"
+#include "core/arch/qvassert.h"
+#include "core/measure/fourcc.h"
+#include "core/measure/qvgeometry.h"
 #include "core/stream/iofailure.h"
-#include "core/value/qvassert.h"
 
 namespace {
 

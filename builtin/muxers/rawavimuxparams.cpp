@@ -1,11 +1,11 @@
 // Parameters of the AVI multiplexer.
 #include "builtin/muxers/rawavimux.h"
 #include "builtin/muxers/streamcodec.h"
-#include "core/engine/params.h"
-#include "core/engine/qvregistry.h"
-#include "core/media/qvgeometry.h"
+#include "core/arch/qvassert.h"
+#include "core/engine/modules/params.h"
+#include "core/engine/modules/qvregistry.h"
+#include "core/measure/qvgeometry.h"
 #include "core/preset/qvpresetmgr.h"
-#include "core/value/qvassert.h"
 
 struct RawAviMuxParams {
     using Mux = RawAviMux;

@@ -4,8 +4,8 @@
 #include <cstring>
 #include <limits>
 
-#include "builtin/encoders/rawoutput.h"
-#include "core/engine/qvfileutil.h"
+#include "builtin/shared/rawoutput.h"
+#include "core/engine/files/qvfileutil.h"
 #include "core/engine/status.h"
 #include "core/stream/buf_impl_base.h"
 #include "core/stream/iofailure.h"

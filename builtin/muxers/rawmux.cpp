@@ -5,14 +5,14 @@
 #include <string>
 
 #include "builtin/creators.h"
-#include "builtin/encoders/rawoutput.h"
 #include "builtin/muxers/rawmuxoutput.h"
 #include "builtin/muxers/streamcodec.h"
-#include "core/engine/qvfileutil.h"
-#include "core/media/fourcc.h"
-#include "core/stream/qvbufstreamsplit.h"
-#include "core/stream/qvfilebufstream.h"
-#include "core/value/qvassert.h"
+#include "builtin/shared/rawoutput.h"
+#include "core/arch/qvassert.h"
+#include "core/engine/files/qvfileutil.h"
+#include "core/measure/fourcc.h"
+#include "core/split/qvbufstreamsplit.h"
+#include "core/stream/file/qvfilebufstream.h"
 
 namespace {
 

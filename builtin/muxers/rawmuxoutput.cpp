@@ -2,7 +2,7 @@
 
 #include <algorithm>
 
-#include "core/engine/qvfileutil.h"
+#include "core/engine/files/qvfileutil.h"
 
 namespace {
 

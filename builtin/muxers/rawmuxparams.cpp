@@ -1,9 +1,9 @@
 // Parameters of the elementary stream export.
 #include "builtin/muxers/rawmux.h"
 #include "builtin/muxers/streamcodec.h"
-#include "core/engine/params.h"
-#include "core/media/qvgeometry.h"
-#include "core/value/qvassert.h"
+#include "core/arch/qvassert.h"
+#include "core/engine/modules/params.h"
+#include "core/measure/qvgeometry.h"
 
 struct RawMuxParams {
     using Mux = RawMux;

@@ -3,7 +3,7 @@
 #include <cstring>
 
 #include "core/encode/qvmuxer.h"
-#include "core/engine/qvregistry.h"
+#include "core/engine/modules/qvregistry.h"
 #include "core/preset/qvpresetmgr.h"
 #include "core/stream/qvbufstrm.h"
 

@@ -1,7 +1,7 @@
 // What a multiplexer asks of the encoder that writes to one of its streams.
 #pragma once
 
-#include "core/engine/qvcodec.h"
+#include "core/engine/modules/qvcodec.h"
 #include "core/value/anycontainer.h"
 
 class QvBufStream;

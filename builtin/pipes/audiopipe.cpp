@@ -5,10 +5,10 @@
 #include <cstring>
 
 #include "builtin/creators.h"
+#include "core/arch/qvassert.h"
 #include "core/decode/qvdecoder.h"
-#include "core/engine/qvlog.h"
+#include "core/engine/log/qvlog.h"
 #include "core/engine/status.h"
-#include "core/value/qvassert.h"
 
 namespace {
 

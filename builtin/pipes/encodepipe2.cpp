@@ -4,13 +4,13 @@
 #include <algorithm>
 
 #include "builtin/creators.h"
-#include "core/engine/params.h"
-#include "core/engine/qvexception.h"
-#include "core/engine/qvlog.h"
-#include "core/engine/qvmodule.h"
-#include "core/engine/qvregistry.h"
+#include "core/arch/qvassert.h"
+#include "core/arch/qvexception.h"
+#include "core/engine/log/qvlog.h"
+#include "core/engine/modules/params.h"
+#include "core/engine/modules/qvmodule.h"
+#include "core/engine/modules/qvregistry.h"
 #include "core/preset/qvpresetmgr.h"
-#include "core/value/qvassert.h"
 
 EncodePipe2::~EncodePipe2() {
     if (getState() == qvStateOpen) finish(true);

@@ -2,12 +2,12 @@
 #include <cstring>
 
 #include "builtin/pipes/encodepipe2.h"
-#include "core/engine/params.h"
-#include "core/engine/qvlog.h"
-#include "core/engine/qvmodule.h"
-#include "core/engine/qvregistry.h"
-#include "core/filter/filtersstate.h"
-#include "core/value/qvassert.h"
+#include "core/arch/qvassert.h"
+#include "core/engine/log/qvlog.h"
+#include "core/engine/modules/params.h"
+#include "core/engine/modules/qvmodule.h"
+#include "core/engine/modules/qvregistry.h"
+#include "core/job/filtersstate.h"
 
 namespace {
 

@@ -4,11 +4,11 @@
 #include <string>
 
 #include "builtin/pipes/encodepipe2.h"
-#include "core/engine/qvexception.h"
-#include "core/engine/qvfileutil.h"
-#include "core/engine/qvlog.h"
+#include "core/arch/qvassert.h"
+#include "core/arch/qvexception.h"
+#include "core/engine/files/qvfileutil.h"
+#include "core/engine/log/qvlog.h"
 #include "core/stream/qvbufstrm.h"
-#include "core/value/qvassert.h"
 
 namespace {
 

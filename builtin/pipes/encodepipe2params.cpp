@@ -5,12 +5,12 @@
 #include <string_view>
 
 #include "builtin/pipes/encodepipe2.h"
-#include "core/engine/params.h"
-#include "core/engine/qvlog.h"
-#include "core/media/qvgeometry.h"
+#include "core/arch/qvassert.h"
+#include "core/engine/log/qvlog.h"
+#include "core/engine/modules/params.h"
+#include "core/measure/qvgeometry.h"
 #include "core/preset/qvpresetmgr.h"
 #include "core/preset/qvprofile.h"
-#include "core/value/qvassert.h"
 
 namespace {
 

@@ -3,13 +3,13 @@
 #include <vector>
 
 #include "builtin/pipes/encodepipe2.h"
-#include "core/engine/params.h"
-#include "core/engine/qvlog.h"
-#include "core/engine/qvregistry.h"
-#include "core/filter/filtersstate.h"
+#include "core/arch/qvassert.h"
+#include "core/engine/log/qvlog.h"
+#include "core/engine/modules/params.h"
+#include "core/engine/modules/qvregistry.h"
+#include "core/job/filtersstate.h"
 #include "core/preset/qvpresetmgr.h"
 #include "core/preset/qvprofile.h"
-#include "core/value/qvassert.h"
 
 namespace {
 

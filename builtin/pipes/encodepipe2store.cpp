@@ -2,11 +2,11 @@
 #include <cstring>
 
 #include "builtin/pipes/encodepipe2.h"
-#include "core/engine/params.h"
-#include "core/filter/filtersstate.h"
+#include "core/arch/qvassert.h"
+#include "core/engine/modules/params.h"
+#include "core/job/filtersstate.h"
 #include "core/preset/qvpresetmgr.h"
 #include "core/preset/qvprofile.h"
-#include "core/value/qvassert.h"
 
 namespace {
 

@@ -3,15 +3,15 @@
 #include <cstring>
 
 #include "builtin/pipes/encodepipe2.h"
-#include "core/engine/params.h"
-#include "core/engine/qvexception.h"
-#include "core/engine/qvlog.h"
-#include "core/engine/qvmodule.h"
-#include "core/engine/qvregistry.h"
+#include "core/arch/qvassert.h"
+#include "core/arch/qvexception.h"
+#include "core/engine/log/qvlog.h"
+#include "core/engine/modules/params.h"
+#include "core/engine/modules/qvmodule.h"
+#include "core/engine/modules/qvregistry.h"
 #include "core/engine/qvutil.h"
-#include "core/filter/filtersstate.h"
+#include "core/job/filtersstate.h"
 #include "core/stream/qvbufstrm.h"
-#include "core/value/qvassert.h"
 
 namespace {
 

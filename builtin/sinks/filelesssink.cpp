@@ -1,7 +1,7 @@
 #include "builtin/sinks/filelesssink.h"
 
-#include "core/engine/params.h"
-#include "core/media/qvgeometry.h"
+#include "core/engine/modules/params.h"
+#include "core/measure/qvgeometry.h"
 
 int FilelessSink::setParam(const char* name, const Any& value) {
     static constexpr QvParamRow<FilelessSink> rows[] = {

@@ -2,8 +2,8 @@
 #pragma once
 
 #include "builtin/sinks/filelesssink.h"
-#include "core/engine/qvmodule.h"
-#include "core/stream/qvbufmem.h"
+#include "core/engine/modules/qvmodule.h"
+#include "core/stream/fifo/qvbufmem.h"
 
 // getInterface(qvOutputQueueInterface) answers the QvAuQueuePoll. The queue lives as long as the sink, so
 // what was encoded can still be fetched after close. Any thread may poll while another encodes.

@@ -3,11 +3,12 @@
 #include <mutex>
 
 #include "builtin/creators.h"
-#include "core/engine/params.h"
-#include "core/engine/qvfileutil.h"
-#include "core/engine/qvlog.h"
-#include "core/media/qvgeometry.h"
-#include "core/value/qvassert.h"
+#include "builtin/shared/donothing.h"
+#include "core/arch/qvassert.h"
+#include "core/engine/files/qvfileutil.h"
+#include "core/engine/log/qvlog.h"
+#include "core/engine/modules/params.h"
+#include "core/measure/qvgeometry.h"
 
 struct FileSinkParams {
     static constexpr int largestBuffer = 1 << 30;

@@ -2,14 +2,10 @@
 #pragma once
 
 #include "builtin/sinks/filelesssink.h"
-#include "core/engine/qvmodule.h"
-#include "core/stream/qvfilebufstream.h"
+#include "core/engine/modules/qvmodule.h"
+#include "core/stream/file/qvfilebufstream.h"
 
 constexpr int qvSinkBufferSize = 0x800000;  // bytes, at first
-
-// A multiplexer that writes files of its own sets this parameter of the sink's stream to 1, so that no empty
-// file appears.
-constexpr char qvSinkDoNothing[] = "doNothing";
 
 // Parameters: "filename" (text) and "bufsize" (bytes, Int32). What could not be written is a status and a
 // text of flush or close; the file is then left incomplete under its name. "filesWritten" answers the

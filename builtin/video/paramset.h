@@ -4,7 +4,7 @@
 #include <limits>
 #include <string_view>
 
-#include "core/engine/params.h"
+#include "core/engine/modules/params.h"
 #include "core/filter/qvprocessutil.h"
 
 namespace paramset {

@@ -3,10 +3,10 @@
 #include <algorithm>
 #include <cstring>
 
-#include "builtin/kernels/samplerows.h"
+#include "builtin/kernels/lines/samplerows.h"
+#include "core/arch/qvassert.h"
 #include "core/engine/status.h"
 #include "core/media/rows_p.h"
-#include "core/value/qvassert.h"
 
 namespace {
 

@@ -1,6 +1,6 @@
 #include "builtin/video/videoeffect.h"
 
-#include "core/engine/qvlog.h"
+#include "core/engine/log/qvlog.h"
 
 namespace {
 

@@ -14,10 +14,10 @@
 #include <span>
 
 #include "builtin/video/paramset.h"
-#include "core/engine/params.h"
+#include "core/engine/modules/params.h"
 #include "core/filter/qvfilter.h"
+#include "core/measure/qvgeometry.h"
 #include "core/media/qvframe.h"
-#include "core/media/qvgeometry.h"
 
 // Lifecycle and hand-over of an effect with one output frame.
 class VideoEffect : public QvVideoFilter {

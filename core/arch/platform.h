@@ -12,6 +12,7 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
 #include <cstdio>
 #include <ctime>
 #include <functional>
@@ -133,6 +134,7 @@ class QV_API QvPlatform {
     virtual std::string fontFile(QvFontFace face);  // full name, empty if the system has no font at all
     virtual std::string cpuFeatures();              // "MMX SSE2 ...", in a fixed order
     virtual std::string platformName();             // "Linux x64"
+    virtual std::uint32_t randomBits();             // from the system's entropy: two processes do not meet
 
     // `name` as one word of a shell command: no character in it can act, and no leading "-" makes an option
     // of it.

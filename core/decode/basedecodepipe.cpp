@@ -3,9 +3,9 @@
 #include <cstring>
 #include <utility>
 
+#include "core/arch/qvassert.h"
 #include "core/engine/status.h"
 #include "core/media/qvbuffer.h"
-#include "core/value/qvassert.h"
 
 DPipeStream::~DPipeStream() = default;
 

@@ -2,15 +2,14 @@
 
 #include <memory>
 
+#include "core/arch/qvassert.h"
+#include "core/arch/qvexception.h"
 #include "core/decode/qvdecoder.h"
-#include "core/encode/qvencodepipe.h"
-#include "core/engine/qvexception.h"
-#include "core/engine/qvfileutil.h"
-#include "core/engine/qvlog.h"
-#include "core/engine/qvmodule.h"
-#include "core/engine/qvregistry.h"
+#include "core/engine/files/qvfileutil.h"
+#include "core/engine/log/qvlog.h"
+#include "core/engine/modules/qvmodule.h"
+#include "core/engine/modules/qvregistry.h"
 #include "core/engine/status.h"
-#include "core/value/qvassert.h"
 
 namespace {
 
@@ -209,16 +208,3 @@ QvDecodePipe* QvDecFactory::restoreDecoder(const Any& filename, const AnyDict& s
     codec.release();
     return decoder;
 }
-
-QvEncodePipe* QvEncFactory::encodePipe() {
-    std::unique_ptr<QvCodec> codec;
-    if (QvModule* module = qv_registry()->module("encpipe")) codec.reset(module->create());
-    if (!codec) {
-        qv_dbg()->error("[QvEncFactory]Internal error, there is no encode pipe module");
-        return nullptr;
-    }
-    codec->init();
-    return static_cast<QvEncodePipe*>(codec.release()->getInterface(QvModuleType::encodePipe));
-}
-
-QvEncodePipe* QvEncFactory::encodePipe(const AnyDict&) { return encodePipe(); }

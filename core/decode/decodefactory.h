@@ -1,4 +1,4 @@
-// From a file name to an open decoder, and the maker of encode pipes.
+// From a file name to an open decoder.
 #pragma once
 
 #include "core/arch/api.h"
@@ -7,7 +7,6 @@
 #include "core/value/anycontainer.h"
 
 class QvDecodePipe;
-class QvEncodePipe;
 
 // A file name is a String, a WString, or a Vector of these (a file in several pieces, opened by the first
 // extension found). The caller owns what is returned. Null: nothing could be opened; why stands in the debug
@@ -30,12 +29,4 @@ class QV_API QvDecFactory {
     // entries; only with one overridden parameter per stream and stream 0 do they agree.
     static QvDecodePipe* restoreDecoder(const Any& filename, const AnyDict& state,
                                         QvFileOpenCb* cb = nullptr);
-};
-
-class QV_API QvEncFactory {
-  public:
-    // A new, initialised pipe of module "encpipe", owned by the caller; null without that module. The
-    // dictionary is not looked at.
-    static QvEncodePipe* encodePipe();
-    static QvEncodePipe* encodePipe(const AnyDict& params);
 };

@@ -7,9 +7,9 @@
 #include <limits>
 #include <new>
 
+#include "core/arch/qvassert.h"
 #include "core/engine/status.h"
 #include "core/media/qvbuffer.h"
-#include "core/value/qvassert.h"
 
 namespace {
 

@@ -6,10 +6,10 @@
 #include <utility>
 #include <vector>
 
-#include "core/engine/qvlog.h"
+#include "core/arch/qvassert.h"
+#include "core/engine/log/qvlog.h"
 #include "core/engine/status.h"
 #include "core/media/qvbuffer.h"
-#include "core/value/qvassert.h"
 
 struct QvDecodePipe::Private {
     std::vector<std::unique_ptr<QvAudioStreamReport>> reports;  // one an audio stream, null until asked for

@@ -34,9 +34,9 @@
 
 #include "core/arch/api.h"
 #include "core/decode/qvaudiostreamreport.h"
-#include "core/engine/qvcodec.h"
-#include "core/media/qvgeometry.h"
-#include "core/media/streamtype.h"
+#include "core/engine/modules/qvcodec.h"
+#include "core/measure/qvgeometry.h"
+#include "core/measure/streamtype.h"
 #include "core/value/any.h"
 #include "core/value/anycontainer.h"
 

@@ -6,14 +6,14 @@
 #include <string_view>
 #include <utility>
 
-#include "core/engine/qvexception.h"
-#include "core/engine/qvfileutil.h"
-#include "core/engine/qvlog.h"
-#include "core/engine/qvregistry.h"
+#include "core/arch/qvexception.h"
+#include "core/document/xmldom.h"
+#include "core/engine/files/qvfileutil.h"
+#include "core/engine/log/qvlog.h"
+#include "core/engine/modules/qvregistry.h"
 #include "core/engine/qvutil.h"
 #include "core/engine/status.h"
-#include "core/media/datetime.h"
-#include "core/value/xmldom.h"
+#include "core/measure/datetime.h"
 
 namespace {
 

@@ -1,7 +1,7 @@
 #include "core/decode/qvdpipelist.h"
 
+#include "core/arch/qvassert.h"
 #include "core/decode/qvdecoder.h"
-#include "core/value/qvassert.h"
 
 QvDecodePipe* QvDPipeList::findByFilename(const Any& name, const QvDecodePipe* after) const {
     int first = 0;

@@ -1,8 +1,8 @@
 #include "core/decode/qvtestgenerator.h"
 
 #include "core/decode/qvdecoder.h"
-#include "core/engine/qvmodule.h"
-#include "core/engine/qvregistry.h"
+#include "core/engine/modules/qvmodule.h"
+#include "core/engine/modules/qvregistry.h"
 #include "core/value/anycontainer.h"
 
 namespace {

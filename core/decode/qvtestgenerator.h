@@ -20,7 +20,7 @@
 #pragma once
 
 #include "core/arch/api.h"
-#include "core/media/qvgeometry.h"
+#include "core/measure/qvgeometry.h"
 #include "core/value/any.h"
 #include "core/value/ptrlist.h"
 

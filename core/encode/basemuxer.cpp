@@ -2,7 +2,7 @@
 
 #include <algorithm>
 
-#include "core/value/qvassert.h"
+#include "core/arch/qvassert.h"
 
 BaseMuxer::BaseMuxer(const QvModule* module) : QvMuxer(module) {}
 

@@ -3,13 +3,13 @@
 #include <optional>
 #include <string>
 
-#include "core/engine/qvlog.h"
-#include "core/engine/qvregistry.h"
-#include "core/filter/filtersstate.h"
-#include "core/media/qvgeometry.h"
-#include "core/stream/qvbufmem.h"
+#include "core/arch/qvassert.h"
+#include "core/engine/log/qvlog.h"
+#include "core/engine/modules/qvregistry.h"
+#include "core/job/filtersstate.h"
+#include "core/measure/qvgeometry.h"
+#include "core/stream/fifo/qvbufmem.h"
 #include "core/stream/qvbufstrm.h"
-#include "core/value/qvassert.h"
 
 namespace {
 

@@ -3,8 +3,8 @@
 #include <cstring>
 #include <span>
 
-#include "core/engine/params.h"
-#include "core/media/qvgeometry.h"
+#include "core/engine/modules/params.h"
+#include "core/measure/qvgeometry.h"
 #include "core/stream/qvbufstrm.h"
 #include "core/value/anycontainer.h"
 

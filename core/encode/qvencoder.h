@@ -9,7 +9,7 @@
 #pragma once
 
 #include "core/encode/codecstate.h"
-#include "core/engine/qvcodec.h"
+#include "core/engine/modules/qvcodec.h"
 #include "core/engine/status.h"
 
 class QvBufStream;

@@ -2,9 +2,9 @@
 
 #include <cstring>
 
-#include "core/engine/params.h"
-#include "core/engine/qvexception.h"
-#include "core/media/qvgeometry.h"
+#include "core/arch/qvexception.h"
+#include "core/engine/modules/params.h"
+#include "core/measure/qvgeometry.h"
 
 namespace {
 

@@ -3,7 +3,7 @@
 #pragma once
 
 #include "core/encode/qvencoder.h"
-#include "core/media/streamtype.h"
+#include "core/measure/streamtype.h"
 #include "core/value/anycontainer.h"
 
 class QvFileMuxConfig;

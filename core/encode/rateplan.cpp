@@ -4,8 +4,8 @@
 #include "core/encode/qvencodepipe.h"
 #include "core/encode/qvencoder.h"
 #include "core/engine/qvutil.h"
-#include "core/media/bitrate.h"
-#include "core/media/streamtype.h"
+#include "core/measure/bitrate.h"
+#include "core/measure/streamtype.h"
 
 namespace {
 

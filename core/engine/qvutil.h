@@ -1,4 +1,5 @@
-// QvUtil: the engine's static services under one name. Each is implemented beside its own subject.
+// QvUtil: the engine's static services under one name. Each is implemented next to its own subject, or one
+// line in core/engine/qvutil.cpp leads there.
 #pragma once
 
 #include "core/arch/api.h"
@@ -12,7 +13,7 @@ class QvFramerate;
 
 class QV_API QvUtil {
   public:
-    // --- Pixel formats (core/engine/pixelformats.cpp)
+    // --- Pixel formats (core/measure/fourcc.h)
 
     // FOURCCs hold their first character in the lowest byte: "BGRA" is 0x41524742.
     static bool equalFcc(unsigned a, unsigned b);  // also BGRA and BGR4, YUY2 and YUYV
@@ -20,7 +21,7 @@ class QV_API QvUtil {
     static bool exchengeableFOURCC(int a, int b);
     static int macroblocks(int width, int height);  // of 16x16, parts counted whole; 0 for no area
 
-    // --- Picture shape (core/engine/pictureaspect.cpp)
+    // --- Picture shape (core/measure/pictureaspect.cpp)
 
     // The pixel aspect x:y, width to height, of a picture that is shown `frameAspect` wide for 1 high. With
     // `broadcast` the sizes of television have their fixed aspects. x:y is 1:1, and the result 0, if a size
@@ -49,7 +50,7 @@ class QV_API QvUtil {
     // maxChars / 2 bytes of the digest are printed. Invalid for other values.
     static Any md5Digest(const Any& value, int maxChars);
 
-    // --- Time (core/engine/timeutil.cpp)
+    // --- Time (core/measure/clocktime.cpp)
 
     // Frame number, truncated, at a time in ticks of a 27 MHz clock. `rate` is made a fraction with a
     // denominator below 10000. The flag belongs to the interface and changes nothing.
@@ -63,7 +64,7 @@ class QV_API QvUtil {
     static constexpr int posSize = 40;
     static void sleep(int milliseconds);
 
-    // --- Facts of the build and the machine (core/engine/buildfacts.cpp)
+    // --- Facts of the build and the machine (core/engine/facts/buildfacts.cpp)
 
     static Any libraryPath();
     static Any libraryVersion();  // "2.5.10.7839"
@@ -71,7 +72,7 @@ class QV_API QvUtil {
     static Any buildPlatform();   // "Linux x64"
     static Any cpuDescription();  // "Processors: 8 Features: MMX MMXEXT ..."
 
-    // --- Names (core/engine/nameutil.cpp)
+    // --- Names (core/engine/files/nameutil.cpp)
 
     static Any tempDir();
     static void winFname(const Any& in, Any& out);
@@ -86,7 +87,7 @@ class QV_API QvUtil {
     // VIDEO, AUDIO, ICON, PROXY and VOICE. Empty if `root` is no text.
     static AnyVector getP2FolderStructure(const Any& root);
 
-    // --- Profiles (core/engine/profiletests.cpp)
+    // --- Profiles (core/preset/profiletests.cpp)
 
     static bool isProfile1(int profile);      // a number of the second scheme, 0x1000000 and above
     static bool isProfile2(int profile);      // a number of the current scheme, 0x2000000 and above
@@ -111,7 +112,7 @@ class QV_API QvUtil {
     // there is none.
     static Any codecStructParam(const QvCodec* codec, const char* field);
 
-    // --- Decoder settings for an encoder (core/transcode/matchparams.cpp)
+    // --- Decoder settings for an encoder (core/encode/matchparams.cpp)
 
     // Copies the named parameters of the decoder's stream 0 of a type, 1 video or 2 audio, to the pipe's
     // first encoder of the type; of "framerate" the nearest in the encoder's "framerateRange". What either
@@ -120,7 +121,7 @@ class QV_API QvUtil {
     static void matchParams(const QvDecodePipe* decoder, int type, QvEncodePipe* pipe,
                             const AnyVector& names);
 
-    // --- Parameter traces, debug log (core/engine/paramtrace.cpp)
+    // --- Parameter traces, debug log (core/engine/modules/paramtrace.cpp)
 
     // One line, and one for each element: `indent` levels of two blanks, label, type, and from column
     // `column` the value.

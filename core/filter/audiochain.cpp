@@ -2,13 +2,13 @@
 #include <algorithm>
 #include <utility>
 
+#include "core/arch/qvassert.h"
 #include "core/engine/qvutil.h"
 #include "core/filter/chainfilters_p.h"
-#include "core/filter/jobdescription.h"
 #include "core/filter/qvprocesspipe.h"
 #include "core/filter/qvprocessutil.h"
-#include "core/media/qvgeometry.h"
-#include "core/value/qvassert.h"
+#include "core/job/jobdescription.h"
+#include "core/measure/qvgeometry.h"
 
 namespace {
 

@@ -2,12 +2,12 @@
 
 #include <string>
 
-#include "core/engine/qvlog.h"
-#include "core/engine/qvmodule.h"
-#include "core/engine/qvplugin.h"
-#include "core/engine/qvregistry.h"
+#include "core/arch/qvassert.h"
+#include "core/engine/log/qvlog.h"
+#include "core/engine/modules/qvmodule.h"
+#include "core/engine/modules/qvplugin.h"
+#include "core/engine/modules/qvregistry.h"
 #include "core/engine/status.h"
-#include "core/value/qvassert.h"
 
 namespace {
 

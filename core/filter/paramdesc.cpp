@@ -1,6 +1,6 @@
 // Descriptions of filter parameters for user interfaces.
+#include "core/arch/qvassert.h"
 #include "core/filter/qvprocessutil.h"
-#include "core/value/qvassert.h"
 
 namespace {
 

@@ -4,14 +4,14 @@
 #include <cstdint>
 #include <cstring>
 
-#include "core/engine/qvlog.h"
-#include "core/engine/qvregistry.h"
+#include "core/arch/qvassert.h"
+#include "core/engine/log/qvlog.h"
+#include "core/engine/modules/qvregistry.h"
 #include "core/engine/status.h"
 #include "core/filter/qvfilter.h"
 #include "core/filter/srscaler.h"
 #include "core/media/qvframe.h"
 #include "core/media/rows_p.h"
-#include "core/value/qvassert.h"
 
 namespace {
 

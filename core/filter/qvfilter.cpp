@@ -3,10 +3,10 @@
 #include <cstring>
 #include <initializer_list>
 
-#include "core/engine/qvlog.h"
-#include "core/engine/qvmodule.h"
+#include "core/arch/qvassert.h"
+#include "core/engine/log/qvlog.h"
+#include "core/engine/modules/qvmodule.h"
 #include "core/engine/status.h"
-#include "core/value/qvassert.h"
 
 namespace {
 

@@ -11,7 +11,7 @@
 #pragma once
 
 #include "core/arch/api.h"
-#include "core/engine/qvcodec.h"
+#include "core/engine/modules/qvcodec.h"
 #include "core/value/anycontainer.h"
 
 class QvFrame;

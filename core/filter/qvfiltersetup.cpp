@@ -4,12 +4,12 @@
 #include <string>
 #include <vector>
 
-#include "core/engine/qvcodec.h"
-#include "core/engine/qvlog.h"
-#include "core/engine/qvregistry.h"
-#include "core/filter/filtersstate.h"
-#include "core/media/qvgeometry.h"
-#include "core/value/qvassert.h"
+#include "core/arch/qvassert.h"
+#include "core/engine/log/qvlog.h"
+#include "core/engine/modules/qvcodec.h"
+#include "core/engine/modules/qvregistry.h"
+#include "core/job/filtersstate.h"
+#include "core/measure/qvgeometry.h"
 
 namespace {
 

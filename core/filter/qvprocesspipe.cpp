@@ -2,7 +2,7 @@
 
 #include <memory>
 
-#include "core/engine/qvregistry.h"
+#include "core/engine/modules/qvregistry.h"
 
 namespace {
 

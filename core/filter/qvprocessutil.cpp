@@ -5,15 +5,15 @@
 #include <cstring>
 #include <vector>
 
+#include "core/arch/qvassert.h"
 #include "core/decode/qvdecoder.h"
 #include "core/encode/qvencodepipe.h"
-#include "core/engine/optionalparam_p.h"
-#include "core/engine/qvlog.h"
-#include "core/filter/jobdescription.h"
+#include "core/engine/log/qvlog.h"
+#include "core/engine/modules/optionalparam_p.h"
 #include "core/filter/qvprocesspipe.h"
-#include "core/media/qvgeometry.h"
+#include "core/job/jobdescription.h"
+#include "core/measure/qvgeometry.h"
 #include "core/stream/qvbufstrm.h"
-#include "core/value/qvassert.h"
 
 namespace {
 

@@ -3,8 +3,8 @@
 #include <limits>
 
 #include "core/filter/chainfilters_p.h"
-#include "core/media/qvgeometry.h"
-#include "core/media/qvratio.h"
+#include "core/measure/qvgeometry.h"
+#include "core/measure/qvratio.h"
 
 namespace {
 

@@ -2,16 +2,16 @@
 #include <cmath>
 #include <utility>
 
-#include "core/engine/qvlog.h"
-#include "core/engine/qvregistry.h"
+#include "core/arch/qvassert.h"
+#include "core/engine/log/qvlog.h"
+#include "core/engine/modules/qvregistry.h"
 #include "core/engine/qvutil.h"
 #include "core/engine/status.h"
 #include "core/filter/chainfilters_p.h"
-#include "core/filter/jobdescription.h"
 #include "core/filter/qvprocesspipe.h"
 #include "core/filter/qvprocessutil.h"
-#include "core/media/qvgeometry.h"
-#include "core/value/qvassert.h"
+#include "core/job/jobdescription.h"
+#include "core/measure/qvgeometry.h"
 
 namespace {
 

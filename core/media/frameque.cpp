@@ -1,7 +1,7 @@
 #include "core/media/frameque.h"
 
+#include "core/arch/qvassert.h"
 #include "core/engine/status.h"
-#include "core/value/qvassert.h"
 
 namespace {
 

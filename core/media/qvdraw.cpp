@@ -5,12 +5,12 @@
 #include <cstdlib>
 #include <cstring>
 
-#include "core/media/exactmath_p.h"
+#include "core/arch/qvassert.h"
+#include "core/measure/exactmath_p.h"
+#include "core/measure/rect.h"
 #include "core/media/qvframe.h"
-#include "core/media/rect.h"
 #include "core/media/rows_p.h"
 #include "core/value/any.h"
-#include "core/value/qvassert.h"
 
 namespace {
 

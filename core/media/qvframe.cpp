@@ -5,11 +5,11 @@
 #include <limits>
 #include <new>
 
-#include "core/engine/qvlog.h"
+#include "core/arch/qvassert.h"
+#include "core/engine/log/qvlog.h"
 #include "core/engine/status.h"
 #include "core/media/rows_p.h"
 #include "core/value/ptrlist.h"
-#include "core/value/qvassert.h"
 
 namespace {
 

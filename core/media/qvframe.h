@@ -5,8 +5,8 @@
 #include <memory>
 
 #include "core/arch/api.h"
-#include "core/media/fourcc.h"
-#include "core/media/qvframerate.h"
+#include "core/measure/fourcc.h"
+#include "core/measure/qvframerate.h"
 #include "core/value/anycontainer.h"
 
 class QvFrame;

@@ -2,13 +2,13 @@
 #include <algorithm>
 #include <optional>
 
-#include "core/engine/qvlog.h"
+#include "core/arch/qvassert.h"
+#include "core/engine/log/qvlog.h"
 #include "core/engine/status.h"
-#include "core/media/exactmath_p.h"
+#include "core/measure/exactmath_p.h"
 #include "core/media/pixelkernels_p.h"
 #include "core/media/qvframe.h"
 #include "core/media/rows_p.h"
-#include "core/value/qvassert.h"
 
 namespace {
 

@@ -4,12 +4,12 @@
 #include <cstring>
 #include <limits>
 
-#include "core/engine/qvlog.h"
+#include "core/arch/qvassert.h"
+#include "core/engine/log/qvlog.h"
 #include "core/engine/status.h"
 #include "core/media/pixelkernels_p.h"
 #include "core/media/qvframe.h"
 #include "core/media/rows_p.h"
-#include "core/value/qvassert.h"
 
 namespace {
 

@@ -2,9 +2,9 @@
 #include <array>
 #include <cstring>
 
+#include "core/arch/qvassert.h"
 #include "core/media/qvframe.h"
 #include "core/media/rows_p.h"
-#include "core/value/qvassert.h"
 
 namespace {
 

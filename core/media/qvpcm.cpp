@@ -7,10 +7,10 @@
 #include <limits>
 #include <new>
 
-#include "core/engine/qvlog.h"
+#include "core/arch/qvassert.h"
+#include "core/engine/log/qvlog.h"
 #include "core/engine/status.h"
 #include "core/value/anycontainer.h"
-#include "core/value/qvassert.h"
 
 namespace {
 

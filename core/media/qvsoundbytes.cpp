@@ -8,7 +8,7 @@
 
 #include <zlib.h>
 
-#include "core/value/qvassert.h"
+#include "core/arch/qvassert.h"
 #include "soundbytes_data.inc"
 
 namespace {

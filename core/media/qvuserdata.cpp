@@ -1,6 +1,6 @@
 #include "core/media/qvuserdata.h"
 
-#include "core/value/qvassert.h"
+#include "core/arch/qvassert.h"
 
 std::span<const unsigned char> QvUserData::packet(int index) const {
     QV_ASSERT(index >= 0 && index < count());

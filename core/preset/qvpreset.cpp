@@ -1,9 +1,9 @@
 #include "core/preset/qvpreset.h"
 
-#include "core/engine/qvlog.h"
+#include "core/arch/qvassert.h"
+#include "core/engine/log/qvlog.h"
 #include "core/preset/qvpresetmgr.h"
 #include "core/preset/qvprofile.h"
-#include "core/value/qvassert.h"
 
 namespace {
 

@@ -3,10 +3,11 @@
 #include <span>
 #include <string_view>
 
-#include "core/engine/qvmodule.h"
-#include "core/engine/qvregistry.h"
+#include "core/arch/qvassert.h"
+#include "core/engine/modules/presethook_p.h"
+#include "core/engine/modules/qvmodule.h"
+#include "core/engine/modules/qvregistry.h"
 #include "core/preset/qvprofile.h"
-#include "core/value/qvassert.h"
 
 namespace {
 
@@ -58,6 +59,15 @@ QvPresetMgr::QvPresetMgr() : p_(std::make_unique<Private>()) {}
 QvPresetMgr::~QvPresetMgr() = default;
 
 QvPresetMgr* qvPresetMgr() { return qv_registry()->presetMgr(); }
+
+const QvPresetHook& qvPresetHook() {
+    static constexpr QvPresetHook hook{
+        .make =
+            [] { return QvPresetHook::Catalogue(new QvPresetMgr, [](QvPresetMgr* gone) { delete gone; }); },
+        .update = [](QvPresetMgr& catalogue) { catalogue.update(); },
+    };
+    return hook;
+}
 
 void QvPresetMgr::update() {
     p_->builtin.clear();

@@ -1,7 +1,7 @@
 #include "core/stream/buf_impl_base.h"
 
+#include "core/arch/qvassert.h"
 #include "core/engine/status.h"
-#include "core/value/qvassert.h"
 
 namespace {
 

@@ -3,7 +3,7 @@
 #include <cerrno>
 #include <system_error>
 
-#include "core/engine/qvlog.h"
+#include "core/engine/log/qvlog.h"
 
 bool QvIoFailure::keep(int code, const char* what, const QvWideString& name) {
     if (code_) return false;

@@ -1,4 +1,4 @@
-#include "core/engine/qvlog.h"
+#include "core/engine/log/qvlog.h"
 #include "core/engine/status.h"
 #include "core/stream/observers_p.h"
 

@@ -1,7 +1,7 @@
 #include "core/stream/qvbufstrm.h"
 
-#include "core/engine/qvthreads.h"
 #include "core/engine/status.h"
+#include "core/engine/threads/qvthreads.h"
 #include "core/stream/iofailure.h"
 
 QvAuxInfoObserver::~QvAuxInfoObserver() = default;

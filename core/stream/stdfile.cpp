@@ -1,6 +1,6 @@
 #include <cerrno>
 
-#include "core/engine/qvfileutil.h"
+#include "core/engine/files/qvfileutil.h"
 #include "core/stream/stdfile_p.h"
 #include "core/value/any.h"
 

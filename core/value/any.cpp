@@ -8,9 +8,9 @@
 
 #include <string.h>
 
-#include "core/media/qvgeometry.h"
+#include "core/arch/qvassert.h"
+#include "core/measure/qvgeometry.h"
 #include "core/value/anycontainer.h"
-#include "core/value/qvassert.h"
 
 namespace {
 

@@ -10,7 +10,7 @@
 //     int n = rate;                        // unchecked read, as asInt32()
 //     int m = rate.asInt32(24);            // 24 unless the type is exactly Int32
 //
-// Failures of Any are programming errors: they throw QvAssertFailure (core/value/qvassert.h).
+// Failures of Any are programming errors: they throw QvAssertFailure (core/arch/qvassert.h).
 #pragma once
 
 #include <bit>
@@ -23,7 +23,7 @@
 
 class AnyDict;
 class AnyVector;
-// Declared whole in "core/media/qvgeometry.h".
+// Declared whole in "core/measure/qvgeometry.h".
 class MediaTime;
 class QvBitrate;
 class QvFramerate;

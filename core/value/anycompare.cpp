@@ -3,7 +3,7 @@
 #include <cstring>
 #include <span>
 
-#include "core/media/qvgeometry.h"
+#include "core/measure/qvgeometry.h"
 #include "core/value/any.h"
 #include "core/value/anycontainer.h"
 

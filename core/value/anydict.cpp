@@ -7,9 +7,9 @@
 #include <memory>
 #include <utility>
 
+#include "core/arch/qvassert.h"
 #include "core/value/anycontainer.h"
 #include "core/value/astring.h"
-#include "core/value/qvassert.h"
 
 namespace {
 

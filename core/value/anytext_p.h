@@ -8,8 +8,8 @@
 
 #include <string.h>
 
+#include "core/arch/qvassert.h"
 #include "core/value/any.h"
-#include "core/value/qvassert.h"
 
 using QvWideView = std::span<const unsigned short>;
 

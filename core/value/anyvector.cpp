@@ -5,8 +5,8 @@
 #include <utility>
 #include <vector>
 
+#include "core/arch/qvassert.h"
 #include "core/value/anycontainer.h"
-#include "core/value/qvassert.h"
 
 // Each element has an address of its own, which it keeps whatever happens to the others.
 struct AnyVector::Impl {

@@ -4,9 +4,9 @@
 #include <string>
 #include <vector>
 
+#include "core/arch/qvassert.h"
 #include "core/value/anycontainer.h"
 #include "core/value/anytext_p.h"
-#include "core/value/qvassert.h"
 #include "core/value/utf.h"
 
 namespace {

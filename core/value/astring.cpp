@@ -2,7 +2,7 @@
 
 #include <cstring>
 
-#include "core/value/qvassert.h"
+#include "core/arch/qvassert.h"
 
 namespace {
 

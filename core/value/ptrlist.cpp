@@ -1,7 +1,7 @@
 #include "core/value/ptrlist.h"
 
+#include "core/arch/qvassert.h"
 #include "core/value/anycontainer.h"
-#include "core/value/qvassert.h"
 
 PtrListImp::PtrListImp(const AnyVector& pointers) {
     for (const Any& pointer : pointers) append(pointer.asGeneric());

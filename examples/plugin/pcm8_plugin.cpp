@@ -7,13 +7,13 @@
 #include <memory>
 
 #include "core/decode/basedecodepipe.h"
-#include "core/engine/params.h"
-#include "core/engine/qvfileutil.h"
-#include "core/engine/qvmodule.h"
-#include "core/engine/qvplugin.h"
+#include "core/engine/files/qvfileutil.h"
+#include "core/engine/modules/params.h"
+#include "core/engine/modules/qvmodule.h"
+#include "core/engine/modules/qvplugin.h"
 #include "core/filter/qvfilter.h"
+#include "core/measure/qvgeometry.h"
 #include "core/media/qvbuffer.h"
-#include "core/media/qvgeometry.h"
 
 namespace {
 

@@ -1,5 +1,5 @@
 // Any file loads or fails with a status; what was loaded can be asked for.
-#include "core/engine/qviniparser.h"
+#include "core/document/qviniparser.h"
 #include "tests/fuzz/fuzz.h"
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {

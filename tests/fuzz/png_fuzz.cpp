@@ -6,7 +6,7 @@
 #include <memory>
 #include <vector>
 
-#include "core/media/pngfile_p.h"
+#include "core/image/pngfile_p.h"
 #include "core/media/qvframe.h"
 #include "tests/fuzz/fuzz.h"
 

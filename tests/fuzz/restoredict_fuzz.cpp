@@ -1,8 +1,8 @@
 // Any bytes as a stored document: restoring never crashes, hangs or takes memory without bound, and what it
 // gives can be stored, restored and stored again with the same bytes.
-#include "core/engine/qvexception.h"
-#include "core/value/xmldom.h"
-#include "core/value/xmltrans.h"
+#include "core/arch/qvexception.h"
+#include "core/document/xmldom.h"
+#include "core/document/xmltrans.h"
 #include "tests/fuzz/fuzz.h"
 
 namespace {

@@ -3,7 +3,7 @@
 #include <algorithm>
 
 #include "builtin/decoders/sccdec.h"
-#include "core/caption/cctext.h"
+#include "core/caption/cc/cctext.h"
 #include "tests/fuzz/fuzz.h"
 
 namespace {

@@ -2,7 +2,7 @@
 #include <cstdio>
 #include <string>
 
-#include "core/caption/qvsubtitles.h"
+#include "core/caption/subtitle/qvsubtitles.h"
 #include "tests/fuzz/fuzz.h"
 
 namespace {

@@ -3,8 +3,8 @@
 
 #include "builtin/decoders/subimporter.h"
 #include "core/arch/platform.h"
-#include "core/caption/qvsubtitlerender.h"
-#include "core/caption/qvtextrenderingoptions.h"
+#include "core/caption/subtitle/qvsubtitlerender.h"
+#include "core/caption/text/qvtextrenderingoptions.h"
 #include "core/media/qvbuffer.h"
 #include "tests/fuzz/fuzz.h"
 

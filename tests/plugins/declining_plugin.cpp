@@ -1,3 +1,3 @@
-#include "core/engine/qvplugin.h"
+#include "core/engine/modules/qvplugin.h"
 
 extern "C" QV_API QvPlugin* plugin_init() { return nullptr; }

@@ -1,4 +1,4 @@
-#include "core/engine/qvplugin.h"
+#include "core/engine/modules/qvplugin.h"
 
 const char* qvTestDependencyName();
 

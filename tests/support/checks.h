@@ -14,8 +14,8 @@
 #include <string>
 #include <vector>
 
+#include "core/arch/qvexception.h"
 #include "core/arch/widename.h"
-#include "core/engine/qvexception.h"
 #include "core/value/anycontainer.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/platform_scope.h"

@@ -1,7 +1,7 @@
 // The engine with its built-in modules, from set-up to tear-down; a fixture has one as its first member.
 #pragma once
 
-#include "core/engine/init.h"
+#include "core/engine/modules/init.h"
 
 struct EngineScope {
     EngineScope() { init_wrapper(nullptr); }

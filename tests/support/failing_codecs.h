@@ -13,12 +13,12 @@
 #include "builtin/encoders/rawvenc.h"
 #include "builtin/muxers/rawmux.h"
 #include "builtin/sinks/qvfilebuiltins.h"
-#include "core/engine/builtinplugin_p.h"
-#include "core/engine/init.h"
-#include "core/engine/qvplugin.h"
-#include "core/engine/qvregistry.h"
+#include "core/arch/qvassert.h"
+#include "core/engine/modules/builtinplugin_p.h"
+#include "core/engine/modules/init.h"
+#include "core/engine/modules/qvplugin.h"
+#include "core/engine/modules/qvregistry.h"
 #include "core/preset/qvpresetmgr.h"
-#include "core/value/qvassert.h"
 
 class FailingOutputs {
   public:

@@ -7,9 +7,9 @@
 #include <string>
 #include <vector>
 
-#include "core/engine/qvmodule.h"
-#include "core/engine/qvplugin.h"
-#include "core/engine/qvregistry.h"
+#include "core/engine/modules/qvmodule.h"
+#include "core/engine/modules/qvplugin.h"
+#include "core/engine/modules/qvregistry.h"
 #include "core/filter/qvfilter.h"
 #include "core/media/qvbuffer.h"
 

@@ -11,7 +11,7 @@
 #include <string_view>
 #include <vector>
 
-#include "core/engine/qvlog.h"
+#include "core/engine/log/qvlog.h"
 #include "core/value/utf.h"
 
 class LogCapture : public QvLogBase {

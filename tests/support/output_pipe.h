@@ -8,7 +8,7 @@
 #include <vector>
 
 #include "core/encode/qvencodepipe.h"
-#include "core/media/qvgeometry.h"
+#include "core/measure/qvgeometry.h"
 #include "tests/support/engine.h"
 #include "tests/support/pictures.h"
 #include "tests/support/temp_folder.h"

@@ -5,6 +5,7 @@
 #include <unistd.h>
 #include <atomic>
 #include <cstdlib>
+#include <random>
 
 namespace {
 
@@ -73,4 +74,9 @@ std::string QvPlatform::platformName() {
     const std::string machine = facts.machine;
     const std::string word = machine == "x86_64" ? "x64" : machine == "aarch64" ? "ARM64" : machine;
     return std::string(facts.sysname) + " " + word;
+}
+
+std::uint32_t QvPlatform::randomBits() {
+    std::random_device entropy;
+    return entropy();
 }

@@ -4,7 +4,7 @@
 
 #include <string>
 
-#include "core/engine/qvlog.h"
+#include "core/engine/log/qvlog.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/temp_folder.h"
 

@@ -2,7 +2,7 @@
 
 #include "builtin/encoders/qvdummyaudio.h"
 #include "builtin/modules.h"
-#include "core/media/qvgeometry.h"
+#include "core/measure/qvgeometry.h"
 #include "core/stream/auxinfoid.h"
 #include "tests/support/checks.h"
 #include "tests/support/fake_streams.h"

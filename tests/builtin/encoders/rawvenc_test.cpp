@@ -2,9 +2,9 @@
 
 #include <future>
 
-#include "builtin/encoders/rawoutput.h"
 #include "builtin/modules.h"
-#include "core/media/qvgeometry.h"
+#include "builtin/shared/rawoutput.h"
+#include "core/measure/qvgeometry.h"
 #include "core/stream/auxinfoid.h"
 #include "tests/support/checks.h"
 #include "tests/support/pictures.h"

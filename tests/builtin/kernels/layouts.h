@@ -7,9 +7,9 @@
 #include <string>
 #include <utility>
 
-#include "builtin/kernels/formats.h"
+#include "builtin/kernels/formats/formats.h"
 #include "core/filter/srscaler.h"
-#include "core/media/fourcc.h"
+#include "core/measure/fourcc.h"
 
 inline unsigned codeOf(const std::string& name) {
     unsigned code = 0;

@@ -1,8 +1,8 @@
 #include <set>
 
 #include "builtin/modules.h"
-#include "core/engine/qvcodec.h"
-#include "core/engine/qvregistry.h"
+#include "core/engine/modules/qvcodec.h"
+#include "core/engine/modules/qvregistry.h"
 #include "tests/support/checks.h"
 #include "tests/support/engine.h"
 

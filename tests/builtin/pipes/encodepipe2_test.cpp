@@ -1,7 +1,7 @@
 #include "builtin/pipes/encodepipe2.h"
 
-#include "core/filter/filtersstate.h"
-#include "core/media/qvgeometry.h"
+#include "core/job/filtersstate.h"
+#include "core/measure/qvgeometry.h"
 #include "core/preset/qvpresetmgr.h"
 #include "core/preset/qvprofile.h"
 #include "tests/support/checks.h"

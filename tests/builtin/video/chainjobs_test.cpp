@@ -1,11 +1,11 @@
 // Jobs through automatic chains of the library's own filters.
 #include "builtin/decoders/sccdec.h"
-#include "core/caption/qvcc.h"
-#include "core/filter/filtersstate.h"
+#include "core/caption/cc/qvcc.h"
 #include "core/filter/qvfiltersetup.h"
 #include "core/filter/userdatacallback.h"
-#include "core/transcode/qvtranscodetask.h"
-#include "core/transcode/translink.h"
+#include "core/job/filtersstate.h"
+#include "core/transcode/link/translink.h"
+#include "core/transcode/task/qvtranscodetask.h"
 #include "tests/core/filter/chains.h"
 #include "tests/support/engine.h"
 

@@ -10,8 +10,8 @@
 #include <vector>
 
 #include "builtin/video/samplelayout.h"
-#include "core/engine/qvregistry.h"
-#include "core/media/qvgeometry.h"
+#include "core/engine/modules/qvregistry.h"
+#include "core/measure/qvgeometry.h"
 #include "tests/support/checks.h"
 #include "tests/support/engine.h"
 #include "tests/support/pictures.h"

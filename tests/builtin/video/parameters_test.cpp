@@ -2,10 +2,10 @@
 // them into another one.
 #include <cmath>
 
-#include "core/caption/qvsubtitlefilter.h"
-#include "core/engine/qvcodec.h"
-#include "core/engine/qvmodule.h"
-#include "core/engine/qvplugin.h"
+#include "core/caption/subtitle/qvsubtitlefilter.h"
+#include "core/engine/modules/qvcodec.h"
+#include "core/engine/modules/qvmodule.h"
+#include "core/engine/modules/qvplugin.h"
 #include "core/filter/qvprocessutil.h"
 #include "tests/builtin/video/effect_frames.h"
 

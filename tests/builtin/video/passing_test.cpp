@@ -1,6 +1,6 @@
 // Filters that let frames pass: the raw dump and the user data callback.
-#include "builtin/video/dumpraw.h"
-#include "builtin/video/userdata.h"
+#include "builtin/video/frames/dumpraw.h"
+#include "builtin/video/frames/userdata.h"
 #include "tests/builtin/video/effect_frames.h"
 
 namespace {

@@ -1,8 +1,8 @@
 #include "core/decode/decodefactory.h"
 
 #include "core/decode/qvdecoder.h"
-#include "core/engine/qvplugin.h"
-#include "core/engine/qvregistry.h"
+#include "core/engine/modules/qvplugin.h"
+#include "core/engine/modules/qvregistry.h"
 #include "tests/core/decode/fake_decoder.h"
 #include "tests/support/checks.h"
 #include "tests/support/engine.h"

@@ -7,7 +7,7 @@
 #include <vector>
 
 #include "core/decode/basedecodepipe.h"
-#include "core/engine/qvmodule.h"
+#include "core/engine/modules/qvmodule.h"
 #include "core/media/qvbuffer.h"
 
 // One video stream of `frames` at 25 a second and one audio stream of 16-bit mono at 48000 Hz, whose sample i

@@ -2,7 +2,7 @@
 
 #include <map>
 
-#include "core/media/qvgeometry.h"
+#include "core/measure/qvgeometry.h"
 #include "tests/support/checks.h"
 #include "tests/support/test_stream.h"
 

@@ -2,7 +2,7 @@
 
 #include "core/encode/qvencoder.h"
 #include "core/engine/qvutil.h"
-#include "core/media/bitrate.h"
+#include "core/measure/bitrate.h"
 #include "tests/support/checks.h"
 #include "tests/support/output_pipe.h"
 

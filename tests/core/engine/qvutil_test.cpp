@@ -3,8 +3,8 @@
 #include <climits>
 #include <cmath>
 
-#include "core/engine/qvfileutil.h"
-#include "core/media/qvframerate.h"
+#include "core/engine/files/qvfileutil.h"
+#include "core/measure/qvframerate.h"
 #include "tests/support/checks.h"
 
 namespace {

@@ -5,10 +5,10 @@
 #include <string>
 
 #include "builtin/modules.h"
-#include "core/filter/jobdescription.h"
 #include "core/filter/qvprocesspipe.h"
 #include "core/filter/qvprocessutil.h"
-#include "core/media/qvgeometry.h"
+#include "core/job/jobdescription.h"
+#include "core/measure/qvgeometry.h"
 #include "tests/support/checks.h"
 #include "tests/support/fake_filters.h"
 #include "tests/support/fake_streams.h"

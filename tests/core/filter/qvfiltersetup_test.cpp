@@ -1,7 +1,7 @@
 #include "core/filter/qvfiltersetup.h"
 
-#include "core/filter/filtersstate.h"
-#include "core/media/qvgeometry.h"
+#include "core/job/filtersstate.h"
+#include "core/measure/qvgeometry.h"
 #include "tests/support/checks.h"
 #include "tests/support/fake_filters.h"
 

@@ -5,8 +5,8 @@
 
 #include "builtin/modules.h"
 #include "core/encode/qvmuxer.h"
+#include "core/measure/qvgeometry.h"
 #include "core/media/qvbuffer.h"
-#include "core/media/qvgeometry.h"
 #include "core/stream/qvbufstrm.h"
 #include "tests/support/checks.h"
 #include "tests/support/fake_streams.h"

@@ -2,8 +2,8 @@
 
 #include <set>
 
+#include "core/measure/rect.h"
 #include "core/media/qvframe.h"
-#include "core/media/rect.h"
 #include "tests/support/checks.h"
 
 namespace {

@@ -4,8 +4,8 @@
 #include <string_view>
 
 #include "core/stream/bufstream.h"
+#include "core/stream/file/qvfilebufstream.h"
 #include "core/stream/qvbufstrm.h"
-#include "core/stream/qvfilebufstream.h"
 #include "tests/support/checks.h"
 #include "tests/support/wav_bytes.h"
 

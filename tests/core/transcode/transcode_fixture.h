@@ -8,8 +8,8 @@
 #include <mutex>
 #include <utility>
 
-#include "core/transcode/qvtranscoder.h"
-#include "core/transcode/qvtranscodetask.h"
+#include "core/transcode/run/qvtranscoder.h"
+#include "core/transcode/task/qvtranscodetask.h"
 #include "tests/support/checks.h"
 #include "tests/support/fake_streams.h"
 

@@ -2,7 +2,7 @@
 
 #include <limits>
 
-#include "core/media/qvgeometry.h"
+#include "core/measure/qvgeometry.h"
 #include "tests/support/checks.h"
 
 namespace {

@@ -1,0 +1,209 @@
+#include "builtin/video/overlay/subtitlewriter.h"
+
+#include <algorithm>
+
+#include "builtin/creators.h"
+#include "core/caption/text/qvtext.h"
+#include "core/caption/text/qvtextrenderingoptions.h"
+#include "core/engine/files/qvfileutil.h"
+#include "core/engine/log/qvlog.h"
+#include "core/engine/modules/qvregistry.h"
+#include "core/filter/qvprocessutil.h"
+#include "core/measure/qvgeometry.h"
+#include "core/media/qvdraw.h"
+
+namespace {
+
+using Settings = SubtitleSettings;
+using Options = QvTextRenderingOptions;
+
+constexpr int largestFont = 4096;
+constexpr double mostSpeed = 1000;
+constexpr double mostDelay = 1e9;  // ms, eleven days
+
+AnyVector encodingRange() {
+    AnyVector range;
+    QvText::availableEncodings(range);
+    return range;
+}
+
+AnyVector effectRange() {
+    AnyVector range;
+    for (int effect = 0; effect < Options::nrEffects; ++effect) {
+        AnyDict row("name", Options::effectName(effect));
+        row.set("identifier", effect);
+        range.append(row);
+    }
+    return range;
+}
+
+int setEncoding(Settings& settings, const Any& value) {
+    int number = 0;
+    if (!qvparam::convert(value, number) || number < 0) return QvStatus::invalidParam;
+    if (number >= Options::byCodePage && QvText::encodingName(number) == "N/A") return QvStatus::invalidParam;
+    settings.encoding = number;
+    return QvStatus::ok;
+}
+
+void getEncoding(const Settings& settings, Any& value) { value = settings.encoding; }
+void getEncodings(const Settings&, Any& value) { value = encodingRange(); }
+void getEffects(const Settings&, Any& value) { value = effectRange(); }
+
+int setFramerate(Settings& settings, const Any& value) {
+    QvFramerate rate;
+    if (!value.isValid()) {
+        settings.framerate.invalidate();
+        return QvStatus::ok;
+    }
+    if (!qvparam::convert(value, rate) || !(rate.rate().ratio() > 0)) return QvStatus::invalidParam;
+    settings.framerate = rate;
+    return QvStatus::ok;
+}
+
+void getFramerate(const Settings& settings, Any& value) { value = settings.framerate; }
+
+template <int Shift>
+int setByte(Settings& settings, const Any& value) {
+    int byte = 0;
+    if (!qvparam::convert(value, byte) || byte < 0 || byte > 255) return QvStatus::invalidParam;
+    settings.color = (settings.color & ~(255 << Shift)) | byte << Shift;
+    return QvStatus::ok;
+}
+
+template <int Shift>
+void getByte(const Settings& settings, Any& value) {
+    value = settings.color >> Shift & 255;
+}
+
+using Access = QvParamAccess<Settings>;
+
+constexpr QvParamRow<Settings> rows[] = {
+    {"subtitle_filename", &Settings::file, qvParamStored},
+    {"font_filename", &Settings::font, qvParamStored},
+    {"font_size", &Settings::fontSize, qvParamStored, 1, largestFont},
+    {"speed", &Settings::speed, qvParamStored, 0, mostSpeed},
+    {"delay", &Settings::delay, qvParamStored, -mostDelay, mostDelay},
+    {"encoding", Access{setEncoding, getEncoding}, qvParamStored},
+    {"encodingRange", Access{nullptr, getEncodings}},
+    {"framerate", Access{setFramerate, getFramerate}, qvParamStored},
+    {"fontEffect", &Settings::fontEffect, qvParamStored, 0, Options::nrEffects - 1},
+    {"pixelAspect", &Settings::pixelAspect, qvParamStored, 0.1, 10},
+    {"fontEffectRange", Access{nullptr, getEffects}},
+    {"color", &Settings::color, qvParamStored, 0, 0xFFFFFF},
+    {"colorR", Access{setByte<16>, getByte<16>}},
+    {"colorG", Access{setByte<8>, getByte<8>}},
+    {"colorB", Access{setByte<0>, getByte<0>}},
+};
+static_assert(qvParamTableOk<Settings>(rows));
+
+AnyVector identifiers(const AnyVector& range) {
+    AnyVector numbers;
+    for (const Any& row : range) numbers.append(row.asDict().get("identifier"));
+    return numbers;
+}
+
+AnyVector paramSet() {
+    const auto desc = [](const char* name, int type, int control, const char* text, const Any& min = Any(),
+                         const Any& max = Any()) {
+        return QvProcessUtil::createParamDesc(name, type, control, text, min, max);
+    };
+    AnyVector set;
+    set.append(desc("subtitle_filename", Any::String, QV_GUI_FILESELECT_LOAD, "Subtitle file"));
+    set.append(desc("font_filename", Any::String, QV_GUI_FILESELECT_LOAD, "Font file"));
+    set.append(desc("font_size", Any::Int32, QV_GUI_EDIT, "Font size in pixels", 1, largestFont));
+    set.append(desc("speed", Any::Float, QV_GUI_EDIT, "Relative subtitle speed", 0.0, mostSpeed));
+    set.append(desc("delay", Any::Float, QV_GUI_EDIT, "Subtitle offset in ms", -mostDelay, mostDelay));
+    set.append(desc("framerate", Any::Float, QV_GUI_EDIT, "Framerate"));
+    set.append(QvProcessUtil::createParamDesc("encoding", Any::Int32, QV_GUI_COMBOBOX, "",
+                                              identifiers(encodingRange())));
+    set.append(QvProcessUtil::createParamDesc("fontEffect", Any::Int32, QV_GUI_COMBOBOX, "",
+                                              identifiers(effectRange())));
+    return set;
+}
+
+// `marked`: the file has a byte order mark, and so is UTF-8 by now.
+Options optionsOf(const Settings& settings, bool marked) {
+    Options options;
+    if (settings.font.empty()) {
+        options.fontRegular = qv_registry()->defaultFontFile(0);
+        if (const Any italic = qv_registry()->defaultFontFileItalic(0); italic.isTrue())
+            options.fontItalic = italic;
+        if (const Any bold = qv_registry()->defaultFontFileBold(0); bold.isTrue()) options.fontBold = bold;
+    } else {
+        options.fontRegular = settings.font.c_str();
+    }
+    options.charSize = settings.fontSize;
+    options.subEncoding = marked ? Options::utf8 : std::min<int>(settings.encoding, Options::byCodePage);
+    options.codePage = settings.encoding >= Options::byCodePage ? settings.encoding : 0;
+    options.fontEffect = settings.fontEffect;
+    options.pixelAspect = settings.pixelAspect;
+    return options;
+}
+
+}  // namespace
+
+QvCodec* newSubtitle() { return new SubtitleWriter; }
+
+SubtitleWriter::SubtitleWriter() : OverlayOf("subtitle", rows) {}
+
+void SubtitleWriter::getParam(const char* name, Any& value) const {
+    const std::string_view asked = name;
+    if (asked == "format")
+        value = subtitles_ ? static_cast<int>(subtitles_->format()) : 0;
+    else if (asked == "paramSet")
+        value = paramSet();
+    else
+        OverlayOf::getParam(name, value);
+}
+
+int SubtitleWriter::open() {
+    if (opened()) close();
+    if (const int result = load()) return result;
+    return OverlayOf::open();
+}
+
+int SubtitleWriter::load() {
+    subtitles_.reset();
+    const Options fonts = optionsOf(settings_, false);
+    const Any font = fonts.fontRegular.toString();
+    qv_dbg()->info("[subwriter] Subtitle file: %s", settings_.file.c_str());
+    qv_dbg()->info("[subwriter] Font file: %s", font.asString(""));
+    qv_dbg()->info("[subwriter] Font size: %d", settings_.fontSize);
+    qv_dbg()->info("[subwriter] Speed, offset: %f, %f", settings_.speed, settings_.delay);
+    qv_dbg()->info("[subwriter] Encoding: %d", settings_.encoding);
+    if (settings_.file.empty()) return QvStatus::ok;
+
+    rateKnown_ = settings_.framerate.isFramerate();
+    QvSubtitles read;
+    if (read.parseFile(settings_.file.c_str(), rateKnown_ ? settings_.framerate.asFramerate()
+                                                          : QvFramerate(QvRatio(25, 1))) != QvStatus::ok)
+        return setError(QvStatus::cannotParse, "Failed to read subtitle file %s", settings_.file.c_str());
+    if (read.unread() > 0)
+        qv_log()->warning("Subtitle file %s: the last %lld bytes of its text are not read",
+                          settings_.file.c_str(), read.unread());
+    else if (read.nrSubtitles() == 0)
+        qv_log()->warning("Subtitle file %s has no subtitles", settings_.file.c_str());
+    const Options options = optionsOf(settings_, read.encoding() != QvSubtitles::markNone);
+    overlay::warnOfFonts(options);
+    if (render_.init(options) != QvStatus::ok)
+        return setError(QvStatus::failed, "Unable to load font rendering library.");
+    subtitles_ = std::move(read);
+    return QvStatus::ok;
+}
+
+int SubtitleWriter::close() {
+    subtitles_.reset();
+    return OverlayOf::close();
+}
+
+int SubtitleWriter::draw(QvFrame& frame) {
+    if (!subtitles_ || !(frame.framerate.rate().ratio() > 0)) return QvStatus::ok;
+    if (!rateKnown_ && subtitles_->format() == QvSubtitles::SUB) subtitles_->changeFramerate(frame.framerate);
+    rateKnown_ = true;
+    const MediaTime shown(frame.frameNr, frame.framerate, MediaTime::defaultTimescale);
+    const double seconds = shown.seconds() * settings_.speed - settings_.delay / 1000.0;
+    QvSubtitle* subtitle = subtitles_->find(MediaTime(seconds));
+    if (!subtitle) return QvStatus::ok;
+    const QvColor color(static_cast<unsigned>(settings_.color));
+    return render_.render(frame, *subtitle, &color);
+}

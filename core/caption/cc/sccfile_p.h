@@ -1,0 +1,27 @@
+// The lines of an SCC file that matter: a timecode and words of four hexadecimal digits, each a byte pair.
+#pragma once
+
+#include <cstdint>
+#include <vector>
+
+#include "core/measure/qvframerate.h"
+#include "core/measure/timecode.h"
+
+class Any;
+
+struct SccLine {
+    QvTimecode timecode;
+    std::size_t words;  // how many of SccFile::words are this line's
+};
+
+struct SccFile {
+    std::vector<SccLine> lines;
+    std::vector<std::uint16_t> words;  // of all lines, in order; the first byte is the high one
+    int highestFrame = 0;              // of the timecodes
+    bool dropFrame = false;            // a line has ";" before the frames
+
+    // Lines with ";" count with `dropFrameLines`. 0; -1: can't be opened or read; -15: no SCC file.
+    int read(const Any& filename, bool dropFrameLines);
+    // What the highest frame number suggests; with `warn` the log says so if that is a guess.
+    QvFramerate likelyRate(bool warn) const;
+};

@@ -1,0 +1,86 @@
+// Text subtitles: SubRip ("srt") and frame-numbered MicroDVD ("sub") files, read, written and searched.
+#pragma once
+
+#include <memory>
+#include <string_view>
+#include <vector>
+
+#include "core/arch/api.h"
+#include "core/measure/qvgeometry.h"
+#include "core/value/any.h"
+#include "core/value/anycontainer.h"
+
+// One entry: lines of text that are shown for a time.
+class QV_API QvSubtitle {
+  public:
+    Any text = "";  // lines separated by "|": a String of UTF-8, or of what bytes a file of no stated
+                    // encoding has; UTF-16 and UTF-32 for the renderer as Generic bytes
+    int rows = 1;   // number of lines
+    QvPoint position{-1, -1};  // on the picture, from its top left corner; -1, -1: the default place
+    MediaTime start;           // at the default timescale
+    MediaTime end;             // the last instant at which it is shown
+    AnyVector fieldMasks;  // Int32 for each character: bit 0 leaves out even picture lines, bit 1 odd ones
+};
+
+// The subtitles of a file in its order. Pointers to entries are valid until the next parseFile.
+class QV_API QvSubtitles {
+  public:
+    enum Format : int { SRT = 1, SUB = 2 };
+    // The byte order mark that a file began with.
+    enum Encoding : int {
+        markNone = 0,
+        markUtf8 = 1,
+        markUtf16be = 2,
+        markUtf16le = 3,
+        markUtf32be = 4,
+        markUtf32le = 5,
+    };
+
+    // Replaces the entries by those of a file, whose extension says the format. `rate` gives the frame
+    // numbers of a SUB file their times. A file named "sub" that holds no "{n}{n}" line is read as SRT, which
+    // also knows the SubViewer form of the times line, "00:00:01.000,00:00:02.000" ("[br]" breaks its
+    // lines). Malformed numbers read as 0.
+    // 0, also for a file without any entry. -1: it can't be read, is no text, or has another extension, or a
+    // SUB line is malformed; the entries before that line are kept.
+    int parseFile(const Any& filename, const QvFramerate& rate);
+    // Writes all entries; a SUB file gets frame numbers at rate(). The lines are printed on the standard
+    // output, too. -1 if the file can't be written completely.
+    int saveToFile(const Any& filename, Format format) const;
+
+    // The entry that is shown at `time` (at the default timescale), or null. Asking for rising times costs
+    // next to nothing. Borrowed. Of entries that overlap any one may be found.
+    QvSubtitle* find(const MediaTime& time);
+    // Keeps each entry on its frame numbers, not on its times.
+    void changeFramerate(const QvFramerate& rate);
+
+    int nrSubtitles() const { return static_cast<int>(entries_.size()); }
+    QvSubtitle* at(int index);  // an assertion outside the range; borrowed
+    const QvSubtitle* at(int index) const;
+    Format format() const { return format_; }
+    const QvFramerate& rate() const { return rate_; }
+    Encoding encoding() const { return encoding_; }
+    // For people: "SubRip", "SubViewer" or "MicroDVD"; and "UTF-16LE" and so on for a file with a mark, else
+    // "ASCII", "UTF-8" where the bytes are that, or "8-bit" for those of a code page that no file tells.
+    const char* formatName() const;
+    const char* encodingName() const;
+    int maxRows() const { return maxRows_; }  // of all entries; 0 without any
+
+    // Bytes of text, as UTF-8, behind the place where parseFile stopped: in an SRT file at a number that no
+    // times follow, in UTF-16 and UTF-32 where the text becomes longer than the file. 0: all was read.
+    long long unread() const { return unread_; }
+
+  private:
+    std::vector<std::unique_ptr<QvSubtitle>> entries_;
+    Format format_ = SRT;
+    Encoding encoding_ = markNone;
+    const char* unmarked_ = "";  // encodingName of a file without a mark
+    bool subViewer_ = false;
+    int maxRows_ = 0;
+    int lastFound_ = 0;
+    long long unread_ = 0;
+    QvFramerate rate_;
+
+    int parse(std::string_view text, std::size_t bound);
+    bool hit(int index, const MediaTime& time);
+    int search(const MediaTime& time);
+};

@@ -1,0 +1,90 @@
+#include "core/caption/subtitle/subtitletext_p.h"
+
+#include <algorithm>
+#include <cstdio>
+#include <limits>
+
+#include "core/arch/platform.h"
+#include "core/caption/subtitle/qvsubtitles.h"
+#include "core/caption/text/qvtext.h"
+#include "core/engine/files/qvfileutil.h"
+#include "core/engine/log/qvlog.h"
+#include "core/engine/status.h"
+
+namespace {
+
+using namespace std::string_view_literals;
+
+constexpr std::size_t spareBytes = 4;
+
+struct CloseFile {
+    void operator()(std::FILE* file) const { std::fclose(file); }
+};
+
+// Old files end their lines with a carriage return alone; the first line tells.
+bool endsLinesWithCr(std::string_view text) {
+    const std::size_t first = text.find_first_of("\r\n");
+    if (first == text.npos) return false;
+    const std::size_t behind = text.find_first_not_of('\r', first);
+    return text[first] == '\r' && (behind == text.npos || text[behind] != '\n');
+}
+
+std::string swappedUnits(std::string_view bytes, std::size_t unit) {
+    std::string out(bytes.substr(0, bytes.size() / unit * unit));
+    for (std::size_t at = 0; at < out.size(); at += unit)
+        std::reverse(out.begin() + static_cast<std::ptrdiff_t>(at),
+                     out.begin() + static_cast<std::ptrdiff_t>(at + unit));
+    return out;
+}
+
+std::string converted(std::string_view bytes, int encoding, bool swapped) {
+    const bool wide = encoding >= QvSubtitles::markUtf32be;
+    const std::string units = swapped ? swappedUnits(bytes, wide ? 4 : 2) : std::string(bytes);
+    return QvText::toUtf8(QvText::toUtf32(units, wide ? QvText::utf32 : QvText::utf16));
+}
+
+bool hasUnits(const SubtitleMark& mark) { return mark.encoding >= QvSubtitles::markUtf16be; }
+
+}  // namespace
+
+void SubtitleBytes::Release::operator()(char* memory) const { qv_platform().release(memory); }
+
+int SubtitleBytes::read(const Any& filename) {
+    if (!filename.isText() || filename.size() == 0) return QvStatus::failed;
+    const std::unique_ptr<std::FILE, CloseFile> file(static_cast<std::FILE*>(qvfopen(filename, "rb")));
+    if (!file) return QvStatus::failed;
+    const long long length = QvFile::flength(file.get());
+    if (length < 0) return QvStatus::failed;
+    const bool fits = length <= std::numeric_limits<int>::max() - static_cast<int>(spareBytes);
+    const auto room = static_cast<std::size_t>(length) + spareBytes;
+    memory_.reset(fits ? static_cast<char*>(qv_platform().allocate(room, 16)) : nullptr);
+    if (!memory_) {
+        qv_dbg()->error("parseFile() internal error");
+        return QvStatus::failed;
+    }
+    size_ = std::fread(memory_.get(), 1, static_cast<std::size_t>(length), file.get());
+    std::fill_n(memory_.get() + size_, room - size_, '\0');
+    return std::ferror(file.get()) ? QvStatus::failed : QvStatus::ok;
+}
+
+SubtitleMark findMark(std::string_view bytes) {
+    if (bytes.starts_with("\xEF\xBB\xBF")) return {QvSubtitles::markUtf8, 3};
+    if (bytes.starts_with("\xFE\xFF")) return {QvSubtitles::markUtf16be, 2};
+    if (bytes.starts_with("\xFF\xFE\0\0"sv)) return {QvSubtitles::markUtf32le, 4};
+    if (bytes.starts_with("\xFF\xFE")) return {QvSubtitles::markUtf16le, 2};
+    if (bytes.starts_with("\0\0\xFE\xFF"sv)) return {QvSubtitles::markUtf32be, 4};
+    return {QvSubtitles::markNone, 0};
+}
+
+std::string subtitleText(std::string_view bytes, const SubtitleMark& mark, bool swapped) {
+    bytes.remove_prefix(mark.size);
+    std::string text = hasUnits(mark) ? converted(bytes, mark.encoding, swapped) : std::string(bytes);
+    if (endsLinesWithCr(text)) std::replace(text.begin(), text.end(), '\r', '\n');
+    return text;
+}
+
+std::size_t subtitleBound(std::string_view bytes, const SubtitleMark& mark) {
+    // The bytes of the file stay the measure of a text that was converted, less the mark once more.
+    const std::size_t marks = hasUnits(mark) ? 2 * mark.size : mark.size;
+    return bytes.size() > marks ? bytes.size() - marks : 0;
+}

@@ -1,0 +1,28 @@
+// Lines of text as glyphs in their places.
+#pragma once
+
+#include <array>
+#include <string_view>
+#include <vector>
+
+#include "core/caption/text/fontface_p.h"
+
+enum class FontStyle { regular, italic, bold };
+
+using FontFaces = std::array<FontFace, 3>;  // in the order of FontStyle
+
+struct PlacedGlyph {
+    FontFace* face;
+    unsigned glyph;
+    long long pen;  // 1/64 pixels from the start of the line's band
+    int rise;       // 1/64 pixels above the baseline
+    int character;  // index of its character in the line
+};
+
+struct TextLine {
+    std::vector<PlacedGlyph> glyphs;  // from left to right
+    long long width = 0;              // pixels that the pen moved
+};
+
+// Lays out a line. Tags change `style`, which goes on to the next line, and are not drawn.
+TextLine layOutLine(std::u32string_view line, FontFaces& faces, FontStyle& style);

@@ -1,0 +1,67 @@
+// The file round trip of dictionaries.
+#include "core/arch/qvassert.h"
+#include "core/arch/qvexception.h"
+#include "core/document/xmldom.h"
+#include "core/document/xmltrans.h"
+#include "core/document/xmltrans_p.h"
+#include "core/engine/log/qvlog.h"
+#include "core/engine/threads/qvtimer.h"
+
+namespace {
+
+Any versionText(const Any& given, const AnyDict& dict) {
+    const Any version = qvXmlVersionText(given.isTrue() ? given : dict.get("__version__"));
+    return version.isTrue() ? version : Any("2.0");
+}
+
+// A broken contract that leaves a trace in the log, but is told by the result.
+bool hasClass(const Any& className) {
+    try {
+        QV_ASSERT(className.isString());
+        return true;
+    } catch (const QvAssertFailure&) {
+        return false;
+    }
+}
+
+}  // namespace
+
+int XmlParser::storeDict(const Any& path, const AnyDict& dict, const char* className, const Any& version) {
+    const Any name = className ? Any(className) : dict.get("__class__");
+    if (!hasClass(name)) return -1;
+    XmlNode root(name.asString());
+    XmlTrans().DictToXml(dict, &root);
+    root.setName(name.asString());
+    root.setAttr("version", versionText(version, dict));
+    return storeXmlTree(path, &root, name.asString());
+}
+
+int XmlParser::restoreDict(const Any& path, AnyDict& dict, Any& rootName, Any& version) {
+    version = -1;
+    dict.clear();
+    XmlParser parser;
+    QvTimer timer;
+    int result = -1;
+    try {
+        result = parser.parseFile(path);
+    } catch (const QvFileException& failure) {
+        qv_dbg()->error("%s", failure.what());
+    }
+    qv_dbg()->debug("XmlParser.restoreDict: parseFile %f", timer.stop());
+    XmlNode* const root = parser.topLevel();
+    if (!root) return result;
+    rootName = root->name();
+    if (root->getAttr("version").isString()) version = root->getAttr("version");
+    if (root->nrChildren() == 0) {
+        qv_dbg()->error("XmlParser.restoreDict: %s holds no entries", path.toString().asString(""));
+        return -1;
+    }
+
+    timer.start();
+    const bool wrapped = root->nrChildren() == 1 && root->child(0)->name() == std::string_view("dict");
+    XmlNode* const node = wrapped ? root->child(0) : root;
+    node->setAttr("class", root->name());
+    XmlTrans().XmlToDict(node, dict);
+    qv_dbg()->debug("XmlParser.restoreDict: toAny %f", timer.stop());
+    return 0;
+}

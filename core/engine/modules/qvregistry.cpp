@@ -1,0 +1,197 @@
+#include "core/engine/modules/qvregistry.h"
+
+#include <algorithm>
+#include <cctype>
+
+#include "core/arch/platform.h"
+#include "core/arch/qvassert.h"
+#include "core/engine/files/qvfileutil.h"
+#include "core/engine/log/qvlog.h"
+#include "core/engine/modules/pluginfile_p.h"
+#include "core/engine/modules/qvmodule.h"
+#include "core/engine/modules/qvplugin.h"
+#include "core/engine/modules/qvregistry_p.h"
+#include "core/engine/qvutil.h"
+#include "core/engine/status.h"
+
+namespace {
+
+constexpr char optionsKey[] = "dbgOpts";
+
+// A slash is the root on this system; the other two forms come with configurations from elsewhere.
+bool isAbsolute(const Any& path) {
+    const Any narrow = path.toString();
+    const char* text = narrow.asString("");
+    return text[0] == '/' || (narrow.size() > 2 && (text[1] == ':' || (text[0] == '\\' && text[1] == '\\')));
+}
+
+Any fontFile(QvFontFace face) { return Any(qv_platform().fontFile(face).c_str()); }
+
+QvFontFace faceFor(int monospace, QvFontFace proportional) {
+    return monospace ? QvFontFace::monospaceBold : proportional;
+}
+
+}  // namespace
+
+int QvRegistry::g_initialized = 0;
+
+QvRegistry* qv_registry() {
+    static QvRegistry registry;
+    return QvRegistry::g_initialized ? &registry : nullptr;
+}
+
+QvRegistry::QvRegistry() : p_(std::make_unique<QvRegistry_p>()) { g_initialized = 1; }
+
+QvRegistry::~QvRegistry() {
+    p_.reset();
+    g_initialized = 0;
+}
+
+// --- Configuration
+
+void QvRegistry::setConfig(AnyDict config) {
+    config_ = config;
+    if (config_.empty()) return;
+    qv_dbg()->debug("[Registry] configuration set to:");
+    QvUtil::debugOutDict(config_);
+}
+
+AnyDict QvRegistry::config() const { return config_; }
+
+Any QvRegistry::tempDir() const {
+    const Any& configured = config_.get("temp_dir");
+    return configured.isTrue() ? configured : QvUtil::tempDir();
+}
+
+Any QvRegistry::userSettingsDir(bool doNotCreate) const {
+    const Any& configured = config_.get("userSettingsDir");
+    Any folder = configured.isTrue() ? configured : Any(".QVTarselSdk");
+    if (!isAbsolute(folder)) folder = QvFile::joinPath(QvFile::homeDir(), folder);
+    if (!doNotCreate && !QvFile::isDir(folder)) QvFile::mkdir(folder);
+    return folder;
+}
+
+bool QvRegistry::throwParamException() const { return config_.get("disable_exceptions").isFalse(); }
+
+Any QvRegistry::getDbgOption(const char* name) const {
+    const Any& options = p_->options.get(optionsKey);
+    if (options.isDict() && options.asDict().isSet(name)) return options.asDict().get(name);
+    return Any(name) == "log_setparam" ? Any(1) : Any();
+}
+
+void QvRegistry::setDbgOption(const char* name, const Any& value) {
+    if (!p_->options.isSet(optionsKey)) p_->options.set(optionsKey, AnyDict());
+    p_->options.get(optionsKey).asDict().set(name, value);
+}
+
+Any QvRegistry::defaultFontFile(int monospace) const {
+    return fontFile(faceFor(monospace, QvFontFace::sans));
+}
+
+Any QvRegistry::defaultFontFileItalic(int monospace) const {
+    return fontFile(faceFor(monospace, QvFontFace::sansItalic));
+}
+
+Any QvRegistry::defaultFontFileBold(int monospace) const {
+    return fontFile(faceFor(monospace, QvFontFace::sansBold));
+}
+
+QvPresetMgr* QvRegistry::presetMgr() const { return p_->presets.get(); }
+void QvRegistry::installLogger(QvLogBase* logger) { qv_dbg()->setLogger(logger); }
+QvLogBase* QvRegistry::logger() const { return qv_dbg()->logger(); }
+
+void QvRegistry::setExternalDecoderIO(const QvExternalIO* io) { p_->externalIO = io ? *io : QvExternalIO{}; }
+
+const QvExternalIO* QvRegistry::externalDecoderIO() const {
+    return p_->externalIO.words[3] ? &p_->externalIO : nullptr;
+}
+
+// --- Plug-ins
+
+void QvRegistry::setPluginFolder(const Any& folder) { pluginFolder_ = folder; }
+Any QvRegistry::getPluginFolder() const { return pluginFolder_; }
+
+int QvRegistry::scanFolder(const Any& folder) {
+    if (folder.isTrue()) setPluginFolder(folder);
+    AnyVector files;
+    if (pluginFolder_.isText()) get_folder_plugin_dlls(pluginFolder_, &files);
+    if (files.empty()) {
+        const Any name = pluginFolder_.toString();
+        qv_dbg()->debug("[Registry] No plugins found in %s", name.asString(""));
+        return QvStatus::failed;
+    }
+    for (const Any& file : files) loadPlugin(file);
+    qvPresetHook().update(*presetMgr());
+    return QvStatus::ok;
+}
+
+int QvRegistry::loadPlugin(const Any& file) {
+    const Any name = file.toString();
+    qv_dbg()->debug("[Registry] Loading plugin: %s", name.asString(""));
+    auto alreadyLoaded = [&](const QvPlugin* loaded) { return loaded->getAttr("filename") == file; };
+    if (std::any_of(plugins_.begin(), plugins_.end(), alreadyLoaded)) {
+        qv_dbg()->debug("[Registry] Already loaded, skipping");
+        return QvStatus::ok;
+    }
+    QvPlugin* plugin = qvLoadPluginFile(file);
+    if (!plugin) return QvStatus::pluginNotLoaded;
+    if (std::find(plugins_.begin(), plugins_.end(), plugin) != plugins_.end()) {
+        // The same file under another name: its one plug-in is in the list.
+        qvReleasePluginFile(*plugin);
+        qv_dbg()->debug("[Registry] Already loaded, skipping");
+        return QvStatus::ok;
+    }
+    plugin->setAttr("filename", file);
+    const Any version = plugin->getAttr("version");
+    const Any date = plugin->getAttr("versionDate");
+    keepDefaults(*plugin);
+    plugins_.push_back(plugin);
+    qv_dbg()->debug("[Registry] Loaded %s (%s %s), containing %d module(s)", plugin->name().asString(""),
+                    version.isTrue() ? version.asString("") : "N/A",
+                    version.isTrue() ? date.asString("") : "N/A", plugin->nrModules());
+    return QvStatus::ok;
+}
+
+int QvRegistry::addPlugin(QvPlugin* plugin) {
+    QV_ASSERT_MSG(plugin, "invalid ptr");
+    plugin->setAttr("filename", "builtin");
+    plugin->setAttr("debug", 0);
+    plugin->setAttr("version", QvUtil::libraryVersion());
+    plugin->setAttr("versionDate", QvUtil::buildDate());
+    keepDefaults(*plugin);
+    qv_dbg()->debug("[Registry] Added %s (%s %s), containing %d module(s)", plugin->desc().asString(""),
+                    QvUtil::libraryVersion().asString(""), QvUtil::buildDate().asString(""),
+                    plugin->nrModules());
+    plugins_.push_back(plugin);
+    return QvStatus::ok;
+}
+
+void QvRegistry::keepDefaults(const QvPlugin& plugin) {
+    for (int i = 0; i < plugin.nrModules(); ++i) {
+        AnyDict attributes;
+        plugin.module(i)->getAttrs(attributes);
+        moduleDefaults_.set(plugin.module(i)->name(), attributes);
+    }
+}
+
+int QvRegistry::nrPlugins() const { return static_cast<int>(plugins_.size()); }
+
+QvPlugin* QvRegistry::plugin(int index) const {
+    return index >= 0 && index < nrPlugins() ? plugins_[static_cast<std::size_t>(index)] : nullptr;
+}
+
+QvPlugin* QvRegistry::plugin(const char* name) const {
+    for (QvPlugin* plugin : plugins_)
+        if (name && plugin->name() == name) return plugin;
+    return nullptr;
+}
+
+void QvRegistry::unload(QvPlugin* plugin) {
+    std::erase(plugins_, plugin);
+    qvUnloadPluginFile(*plugin);
+}
+
+void QvRegistry::cleanup() {
+    while (!plugins_.empty()) unload(plugins_.front());
+    qv_dbg()->setLogger(nullptr);
+}

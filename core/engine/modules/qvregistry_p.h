@@ -1,0 +1,12 @@
+// The private part of the registry.
+#pragma once
+
+#include "core/engine/modules/presethook_p.h"
+#include "core/engine/modules/qvregistry.h"
+
+class QvRegistry_p {
+  public:
+    AnyDict options;  // the debug options, under "dbgOpts"
+    QvPresetHook::Catalogue presets = qvPresetHook().make();
+    QvExternalIO externalIO;
+};

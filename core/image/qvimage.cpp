@@ -1,0 +1,91 @@
+#include "core/image/qvimage.h"
+
+#include <cstdio>
+#include <memory>
+#include <string>
+
+#include "core/arch/platform.h"
+#include "core/arch/qvassert.h"
+#include "core/engine/log/qvlog.h"
+#include "core/engine/modules/qvregistry.h"
+#include "core/engine/status.h"
+#include "core/filter/qvfilter.h"
+#include "core/image/bmpfile_p.h"
+#include "core/image/pngfile_p.h"
+#include "core/media/qvframe.h"
+#include "core/value/any.h"
+
+namespace {
+
+struct CloseFile {
+    void operator()(std::FILE* file) const { std::fclose(file); }
+};
+using File = std::unique_ptr<std::FILE, CloseFile>;
+
+// The name in UTF-8.
+std::string fileName(const Any& path) {
+    const Any text = path.toString();
+    return text.asString("");
+}
+
+constexpr int videoFilterInterface = 12;
+
+// The frame as BGR3, made by `scaler`, which owns it. Null, with a message, if that can't be had.
+const QvFrame* asBgr3(const QvFrame& frame, std::unique_ptr<QvCodec>& scaler) {
+    scaler.reset(qv_registry()->newCodec("scaler"));
+    auto* filter = scaler ? static_cast<QvVideoFilter*>(scaler->getInterface(videoFilterInterface)) : nullptr;
+    if (!filter) {
+        qv_log()->error("[Save image] Can not create scaler.");
+        return nullptr;
+    }
+    filter->setParam("outWidth", frame.width());
+    filter->setParam("outHeight", frame.height());
+    filter->setParam("FOURCC", "BGR3");
+    QvFrame input(frame);
+    if (filter->open() != QvStatus::ok || filter->write(input) != QvStatus::ok || filter->ready() < 1) {
+        qv_log()->error("[Save image] Can not convert %s frame.", frame.str_four_cc());
+        return nullptr;
+    }
+    return filter->frame();
+}
+
+// Nothing is left that looks like a picture. Devices and pipes stay.
+void removePartial(const std::string& name) {
+    QvFileStatus status;
+    if (qv_platform().status(name.c_str(), status) && status.isRegular)
+        qv_platform().removeFile(name.c_str());
+}
+
+}  // namespace
+
+int QvImage::saveFrame(const QvFrame& frame, const Any& path, int format) {
+    QV_ASSERT(frame.inited());
+    QV_ASSERT(format != bmp || frame.four_cc() == QvFourcc::BGR3);
+    std::unique_ptr<QvCodec> scaler;
+    const QvFrame* picture = frame.four_cc() == QvFourcc::BGR3 ? &frame : asBgr3(frame, scaler);
+    if (!picture) return QvStatus::failed;
+
+    const std::string name = fileName(path);
+    File file(qv_platform().openFile(name.c_str(), "wb"));
+    if (!file) {
+        qv_log()->error("[Save image] Can not open %s for writing.", name.c_str());
+        return QvStatus::failed;
+    }
+    bool written = format == bmp ? qvWriteBmp(*picture, file.get()) : qvWritePng(*picture, file.get());
+    written = std::fclose(file.release()) == 0 && written;
+    if (written) return QvStatus::ok;
+    qv_log()->error("Can not write file");
+    removePartial(name);
+    return QvStatus::failed;
+}
+
+int QvImage::loadFrame(QvFrame& picture, const Any& path, QvFrame* alpha, unsigned) {
+    const std::string name = fileName(path);
+    const File file(qv_platform().openFile(name.c_str(), "rb"));
+    if (!file) {
+        qv_log()->error("Can not open %s for reading", name.c_str());
+        return QvStatus::failed;
+    }
+    if (!qvIsPng(file.get())) return QvStatus::failed;
+    return qvReadPng(file.get(), name.c_str(), picture, alpha);
+}

@@ -1,0 +1,37 @@
+// What one video or audio conversion has to do, from the format of a decoder stream to that of an encoder.
+#pragma once
+
+#include "core/measure/qvgeometry.h"
+#include "core/value/anycontainer.h"
+
+struct VideoJobDescription {
+    int inWidth = 0;  // pixels
+    int inHeight = 0;
+    unsigned inFOURCC = 0;
+    int inITU = 0;  // colour matrix: 0 unknown, 1 BT.601, 2 BT.709
+    QvFramerate inFramerate;
+    int startFrame = 0;  // first input frame
+    int stopFrame = 0;   // last input frame, inclusive
+    double inFrameAspect = 1.0;
+    int outITU = 0;
+    int outWidth = 0;
+    int outHeight = 0;
+    unsigned outFOURCC = 0;
+    QvFramerate outFramerate;
+    double outFrameAspect = 1.0;
+    int topBlankingLines = 0;  // lines of blanking that the encoder wants on top
+    AnyDict filters;           // a FiltersState
+};
+
+struct AudioJobDescription {
+    int inBitsPerSample = 0;
+    int inSamplerate = 0;
+    int inChannels = 0;
+    int outBitsPerSample = 0;
+    int outSamplerate = 0;
+    int outChannels = 0;
+    // One entry an output channel: a source dictionary with "channel" and optionally "stream", a vector of
+    // such (mixed), or false for silence. Empty: channels go straight through.
+    AnyVector connMatrix;
+    AnyVector filters;  // stored audio filters
+};

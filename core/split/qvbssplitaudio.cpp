@@ -1,0 +1,297 @@
+#include <algorithm>
+#include <cstring>
+#include <string>
+#include <vector>
+
+#include "core/arch/qvassert.h"
+#include "core/engine/files/qvfileutil.h"
+#include "core/engine/log/qvlog.h"
+#include "core/engine/status.h"
+#include "core/media/qvpcm.h"
+#include "core/split/qvbufstreamsplit.h"
+#include "core/split/wavheader_p.h"
+#include "core/stream/file/qvfilebufstream.h"
+#include "core/stream/iofailure.h"
+#include "core/stream/stdfile_p.h"
+
+namespace {
+
+// Blocks of this size end at its multiples in the file: a page that is written in two pieces costs twice.
+constexpr size_t gatheredBytes = size_t{1} << 16;
+
+// A file of samples, gathered into large blocks: those of a turn are a few kilobytes.
+class SampleFile {
+  public:
+    bool open(const QvWideString& name) {
+        name_ = name;
+        if (!file_.open(name, "wb")) return false;
+        file_.setUnbuffered();
+        gathered_.reserve(gatheredBytes);
+        return true;
+    }
+    bool write(const unsigned char* data, size_t bytes) {
+        while (bytes) {
+            const size_t piece =
+                std::min(bytes, gatheredBytes - static_cast<size_t>(position_ % gatheredBytes));
+            gathered_.insert(gathered_.end(), data, data + piece);
+            position_ += piece;
+            data += piece;
+            bytes -= piece;
+            if (position_ % gatheredBytes == 0 && !flush()) return false;
+        }
+        return file_.isOpen();
+    }
+    bool flush() {
+        const bool ok = gathered_.empty() || file_.write(gathered_.data(), gathered_.size());
+        gathered_.clear();
+        return ok;
+    }
+    bool close() {
+        if (!file_.isOpen()) return true;
+        const bool flushed = flush();
+        return file_.close() && flushed;
+    }
+    const QvWideString& name() const { return name_; }
+    int error() const { return file_.error(); }
+
+  private:
+    StdFile file_;
+    QvWideString name_;
+    std::vector<unsigned char> gathered_;
+    unsigned long long position_ = 0;  // bytes that were written and gathered
+};
+
+}  // namespace
+
+struct QvBsSplitAudio::Wav {
+    struct File {
+        SampleFile file;
+        QvPcm samples;  // of its channel; in split mode only
+    };
+
+    WavFormat format{};  // of the stream
+    bool split = false;
+    bool ended = false;
+    std::vector<std::unique_ptr<File>> files;  // one for each channel, or the only one
+    QvPcm work;                                // interleaved samples of one access unit; in split mode only
+    AnyVector channelPointers;
+    unsigned carried = 0;  // bytes of an incomplete sample at the head of the ring
+
+    WavFormat fileFormat() const {
+        return {format.samplerate, split ? 1 : format.channels, format.bitsPerSample};
+    }
+};
+
+QvBsSplitAudio::QvBsSplitAudio(QvCodec* owner) : QvBufStreamFifoCb(owner) {}
+
+QvBsSplitAudio::~QvBsSplitAudio() { QvBsSplitAudio::destroy(0); }
+
+int QvBsSplitAudio::initPlain(const AnyDict& newParams) {
+    AnyDict merged(params());
+    merged.update(newParams);
+    destroy(0);
+    QvBufStream::init(merged);
+    inner_ = std::make_unique<QvFileBufStream>(owner());
+    shareFailure(*inner_);
+    const int status = inner_->init(merged);
+    setInited(status == QvStatus::ok);
+    return status;
+}
+
+int QvBsSplitAudio::init(const AnyDict& newParams) {
+    const Any& isPcm = newParams.get("isPcm");
+    if (isPcm.isInt32() && isPcm.asInt32() == 0) return initPlain(newParams);
+    if (inner_ || wav_) destroy(0);
+    wav_ = std::make_unique<Wav>();
+    if (const int status = QvBufStreamFifoCb::init(newParams)) return status;
+    if (openFiles()) return QvStatus::ok;
+    destroy(0);
+    return QvStatus::failed;
+}
+
+bool QvBsSplitAudio::openFiles() {
+    Wav& wav = *wav_;
+    const WavFormat format = {params().getInt32("samplerate", 0), params().getInt32("channels", 0),
+                              params().getInt32("bitsPerSample", 0)};
+    wav.format = format;
+    wav.split = params().get("split").isTrue();
+    const bool legal = wavFormatIsLegal(format) && (!wav.split || format.channels <= maxFiles);
+    bufstream* ring = output();
+    if (!legal || ring->chunksize(ring) < static_cast<unsigned>(format.sampleBytes())) {
+        qv_log()->error("[split writer] Can not write WAV with %d Hz, %d channels, %d bits.",
+                        format.samplerate, format.channels, format.bitsPerSample);
+        return false;
+    }
+    const Any name = params().get("outfilename");
+    if (!wav.split) return openFile(name);
+    if (!name.isText()) return openFile(Any(""));
+    if (wav.work.init(format.samplerate, format.channels, format.valueBytes(), format.samplerate))
+        return false;
+    for (int channel = 0; channel < format.channels; ++channel) {
+        if (!openFile(_channelFileName(name, channel))) return false;
+        if (wav.files.back()->samples.init(format.samplerate, 1, format.valueBytes(), format.samplerate))
+            return false;
+    }
+    return true;
+}
+
+Any QvBsSplitAudio::_channelFileName(const Any& name, int channel) {
+    const Any number = Any::sprintf("#%02d.", channel);
+    const Any file = Any::strcat(Any::strcat(QvFile::getBasename(name), number), QvFile::getExt(name, false));
+    return QvFile::joinPath(QvFile::getPath(name), file);
+}
+
+// Appends the file to the list, with room for the header in it.
+bool QvBsSplitAudio::openFile(const Any& name) {
+    static constexpr unsigned char room[wavHeaderBytes] = {};
+    const std::string narrow = qv_os_name(name);
+    auto& entry = *wav_->files.emplace_back(std::make_unique<Wav::File>());
+    if (!entry.file.open(qv_wide_name(narrow))) {
+        failure()->note(entry.file.error(), "Can not open file", entry.file.name());
+        qv_log()->error("[split writer] Failed to open %s.", narrow.c_str());
+        return false;
+    }
+    if (entry.file.write(room, sizeof room) && entry.file.flush()) return true;
+    failure()->note(entry.file.error(), "Failed to write to", entry.file.name());
+    qv_log()->error("[split writer] Failed to write to %s.", narrow.c_str());
+    entry.file.close();
+    return false;
+}
+
+void QvBsSplitAudio::destroy(int abort) {
+    if (wav_) {
+        QvBufStreamFifoCb::destroy(abort);
+        for (size_t i = 0; i < wav_->files.size(); ++i) closeFile(static_cast<int>(i));
+        wav_.reset();
+    }
+    if (inner_) inner_->destroy(abort);
+    inner_.reset();
+    setInited(false);
+}
+
+void QvBsSplitAudio::flush() {
+    if (wav_)
+        QvBufStreamFifoCb::flush();
+    else if (inner_)
+        inner_->flush();
+}
+
+bufstream* QvBsSplitAudio::input() {
+    if (wav_) return QvBufStreamFifoCb::input();
+    QV_ASSERT(inner_);
+    return inner_->input();
+}
+
+bufstream* QvBsSplitAudio::output() {
+    if (wav_) return QvBufStreamFifoCb::output();
+    QV_ASSERT(inner_);
+    return inner_->output();
+}
+
+void QvBsSplitAudio::cbProgress(int) {}
+
+void QvBsSplitAudio::cbAuxinfo(unsigned, unsigned id, void* info, unsigned size) {
+    if (id == QvAuxId::STREAM_END_CODE) onStreamEnd();
+    if (id != QvAuxId::AUDIO_AU_CODE) return;
+    uint32_t bytes;
+    QV_ASSERT(info && size >= sizeof bytes);
+    std::memcpy(&bytes, info, sizeof bytes);
+    _onAudioBytes(bytes);
+}
+
+// An access unit may end inside a sample: the rest stays in the ring and goes with the next one.
+void QvBsSplitAudio::_onAudioBytes(unsigned bytes) {
+    if (wav_->ended) return stopProcessing();
+    bufstream* ring = output();
+    const unsigned sampleBytes = static_cast<unsigned>(wav_->format.sampleBytes());
+    const unsigned waiting = wav_->carried + bytes;
+    QV_ASSERT(waiting >= bytes && waiting <= ring->usable(ring));
+    wav_->carried = waiting % sampleBytes;
+    const unsigned whole = waiting - wav_->carried;
+    if (!(wav_->split ? writeChannels(ring, whole) : writeInterleaved(ring, whole))) stopProcessing();
+}
+
+// Straight from the ring to the file.
+bool QvBsSplitAudio::writeInterleaved(bufstream* ring, unsigned bytes) {
+    while (bytes) {
+        const unsigned piece = std::min(bytes, ring->chunksize(ring));
+        const unsigned char* block = ring->request(ring, piece);
+        QV_ASSERT(block);
+        if (!writeItem(0, block, piece)) return false;
+        ring->confirm(ring, piece);
+        bytes -= piece;
+    }
+    return true;
+}
+
+// Moves whole samples from the ring into the work buffer.
+bool QvBsSplitAudio::takeSamples(bufstream* ring, unsigned bytes) {
+    QvPcm& work = wav_->work;
+    const unsigned sampleBytes = static_cast<unsigned>(wav_->format.sampleBytes());
+    const int count = static_cast<int>(bytes / sampleBytes);
+    if (count > work.size() && work.grow(count - work.size()) < 0) return false;
+    work.erase(work.samples());
+    const unsigned chunk = ring->chunksize(ring);
+    while (bytes) {
+        const unsigned piece = std::min(bytes, chunk - chunk % sampleBytes);
+        const unsigned char* block = ring->request(ring, piece);
+        QV_ASSERT(block);
+        if (work.write(static_cast<int>(piece / sampleBytes), block)) return false;
+        ring->confirm(ring, piece);
+        bytes -= piece;
+    }
+    return true;
+}
+
+bool QvBsSplitAudio::writeChannels(bufstream* ring, unsigned bytes) {
+    if (!takeSamples(ring, bytes)) return false;
+    const int count = wav_->work.samples();
+    if (!count) return true;
+    AnyVector& pointers = wav_->channelPointers;
+    pointers.clear();
+    for (const auto& entry : wav_->files) {
+        QvPcm& samples = entry->samples;
+        if (count > samples.size() && samples.grow(count - samples.size()) < 0) return false;
+        samples.setSamples(count);
+        pointers.append(Any(static_cast<const void*>(samples.ptr(0)), 0));
+    }
+    wav_->work.combineRead(count, pointers);
+    for (size_t i = 0; i < wav_->files.size(); ++i) {
+        const QvPcm& samples = wav_->files[i]->samples;
+        if (!writeItem(static_cast<int>(i), samples.ptr(0), static_cast<unsigned>(samples.bytes())))
+            return false;
+    }
+    return true;
+}
+
+bool QvBsSplitAudio::writeItem(int file, const unsigned char* data, unsigned bytes) {
+    auto& entry = *wav_->files[static_cast<size_t>(file)];
+    if (entry.file.write(data, bytes)) return true;
+    failure()->report(entry.file.error(), "Failed to write to", entry.file.name());
+    return false;
+}
+
+bool QvBsSplitAudio::closeFile(int file) {
+    auto& entry = *wav_->files[static_cast<size_t>(file)];
+    if (entry.file.close()) return true;
+    failure()->report(entry.file.error(), "Failed to write to", entry.file.name());
+    return false;
+}
+
+void QvBsSplitAudio::onStreamEnd() {
+    if (!wav_ || wav_->ended) return;
+    wav_->ended = true;
+    if (wav_->carried)
+        qv_log()->warning("[split writer] The stream ends inside a sample: %u bytes are dropped.",
+                          wav_->carried);
+    bool closed = true;
+    for (size_t i = 0; i < wav_->files.size(); ++i) closed &= closeFile(static_cast<int>(i));
+    if (!closed) stopProcessing();
+    _writeWavHeaders();
+    for (const auto& entry : wav_->files) entry->samples.destroy();
+    wav_->work.destroy();
+}
+
+void QvBsSplitAudio::_writeWavHeaders() {
+    for (const auto& entry : wav_->files) writeWavHeader(entry->file.name(), wav_->fileFormat(), *failure());
+}

@@ -1,0 +1,238 @@
+// A task as a stored dictionary, and back.
+#include <algorithm>
+#include <memory>
+
+#include "core/arch/qvassert.h"
+#include "core/arch/qvexception.h"
+#include "core/decode/decodefactory.h"
+#include "core/decode/qvdecoder.h"
+#include "core/encode/qvencodepipe.h"
+#include "core/engine/log/qvlog.h"
+#include "core/engine/qvutil.h"
+#include "core/engine/status.h"
+#include "core/transcode/link/translink.h"
+#include "core/transcode/task/qvtranscodetask.h"
+
+namespace {
+
+const char* printable(const Any& text, Any& holder) {
+    holder = text.isWString() ? text.toString() : text;
+    return holder.isString() ? holder.asString() : "";
+}
+
+AnyDict storedSource(const TransLink& link) {
+    AnyDict source;
+    source.set("file", link.decoder()->QvCodec::getParam("filename"));
+    source.set("stream", Any(Pair(link.type(), link.decStreamNr())));
+    source.set("process", static_cast<const AnyDict&>(link.processParams()));
+    return source;
+}
+
+// The processing parameters of source 0 of the number-th stored stream of a type.
+AnyDict storedProcessParams(const AnyVector& streams, int type, int number) {
+    for (int i = 0; i < streams.size(); ++i) {
+        if (!streams.at(i).isDict() || streams.at(i).asDict().getInt32("type", 0) != type) continue;
+        if (number-- > 0) continue;
+        const AnyVector sources = streams.at(i).asDict().getVector("sources");
+        if (!sources.at(0).isDict()) break;
+        return sources.at(0).asDict().getDict("process");
+    }
+    return AnyDict();
+}
+
+// Null when it can't be opened, also because its settings are of a decoder that is not installed.
+QvDecodePipe* openInput(const AnyDict& file, QvFileOpenCb* callback) {
+    const AnyDict settings = file.getDict("decoder");
+    if (!settings.get("name").isString())
+        return QvDecFactory::decodePipe(file.get("filename"), Any(), callback, nullptr);
+    try {
+        return QvDecFactory::restoreDecoder(file.get("filename"), settings, callback);
+    } catch (const QvAssertFailure&) {
+        return nullptr;
+    }
+}
+
+void removeSurplusStreams(QvEncodePipe& pipe, int type, int wanted) {
+    while (pipe.nrStreams(type) > wanted) pipe.removeStream(type, pipe.nrStreams(type) - 1);
+}
+
+}  // namespace
+
+struct QvTask::ForgetEncoder {
+    QvTask& task;
+    bool armed = true;
+    ~ForgetEncoder() {
+        if (!armed) return;
+        task.links_.clear();
+        task.decoders_.clear();
+        task.encoder_ = nullptr;
+    }
+};
+
+void QvTask::store(AnyDict& dict, int) const {
+    dict.clear();
+    dict.set("__version__", "2.0");
+    dict.set("__class__", "TranscodeTask");
+    AnyVector files;
+    for (int i = 0; i < decoders_.size(); ++i) {
+        AnyDict file, decoder;
+        file.set("filename", decoders_.at(i)->QvCodec::getParam("filename"));
+        decoders_.at(i)->store(decoder);
+        file.set("decoder", decoder);
+        files.append(file);
+    }
+    dict.set("files", files);
+    if (postprocess_.isValid()) dict.set("postProcess", postprocess_);
+    if (!encoder_) return;
+    AnyDict encoder;
+    encoder_->store(encoder);
+    dict.set("encoder", encoder);
+    dict.set("filename", encoder_->getFilename());
+    AnyVector streams;
+    for (int i = 0; i < encoder_->nrStreams(); ++i) {
+        QvOStream* stream = encoder_->streamAt(i);
+        const int number = encoder_->streamNr(stream);
+        AnyDict entry;
+        entry.set("type", stream->type);
+        if (const TransLink* link = getLinkForOutput(stream->type, number)) {
+            QV_ASSERT(link->encStreamNr() == number);
+            AnyVector sources;
+            sources.append(storedSource(*link));
+            entry.set("sources", sources);
+        }
+        streams.append(entry);
+    }
+    dict.set("streams", streams);
+}
+
+int QvTask::openInputs(const AnyVector& files, QvDPipeList& opened, QvFileOpenCb* callback) {
+    for (int i = 0; i < files.size(); ++i) {
+        if (!files.at(i).isDict()) continue;
+        const AnyDict& file = files.at(i).asDict();
+        Any name;
+        if (QvDecodePipe* decoder = openInput(file, callback))
+            opened.append(decoder);
+        else
+            qv_dbg()->warning("Task.restore: failed to open %s", printable(file.get("filename"), name));
+    }
+    return opened.size();
+}
+
+int QvTask::restore(const AnyDict& state, QvDPipeList& decoders, QvEncodePipe** encoderOut, int,
+                    QvFileOpenCb* callback) {
+    unlink();
+    if (!state.get("__version__").isString() || !(state.get("__class__") == "TranscodeTask")) {
+        setError(QvStatus::invalidStructure, "Task.restore: Invalid task state structure");
+        QV_FAIL(errorDesc());
+    }
+    const Any& settings = state.get("encoder");
+    const AnyVector streams = state.getVector("streams");
+    const char* noStreams = "Task.restore: Invalid task state structure - no output streams";
+    if (streams.empty()) return setError(QvStatus::invalidStructure, "%s", noStreams);
+    if (!settings.isDict() || settings.asDict().empty()) {
+        QvUtil::debugOutDict(state);
+        return setError(QvStatus::invalidStructure,
+                        "Task.restore: Invalid task state structure - missing encoder settings");
+    }
+    if (settings.asDict().getVector("streams").empty())
+        return setError(QvStatus::invalidStructure, "%s", noStreams);
+    std::unique_ptr<QvEncodePipe> pipe(QvEncodePipe::create());
+    QV_ASSERT_MSG(pipe, "Task.restore: could not create EncodePipe");
+    if (const int result = pipe->restore(settings.asDict()); result != QvStatus::ok)
+        return setError(result, "Task.restore: %s", pipe->errorDesc());
+    if (state.get("filename").isText()) pipe->setFilename(state.get("filename"));
+    const AnyVector& files = state.getVector("files");
+    if (files.empty())
+        return setError(QvStatus::invalidStructure,
+                        "Task.restore: invalid task state structure - no input file(s) specified");
+    QvDPipeList opened;
+    if (openInputs(files, opened, callback) == 0)
+        return setError(QvStatus::cannotParse, "Task.restore: no input file(s) successfully opened");
+    for (int i = 0; i < opened.size(); ++i) decoders.append(opened.at(i));
+    encoder_ = pipe.get();
+    ForgetEncoder forget{*this};  // the pipe goes with a failure, so nothing may point to it
+    for (int i = 0; i < pipe->nrStreams(); ++i) {
+        const AnyDict entry = streams.at(i).isDict() ? streams.at(i).asDict() : AnyDict();
+        if (const int result = linkStoredStream(entry, i, decoders); result < 0) return result;
+    }
+    postprocess_ = state.get("postProcess");
+    forget.armed = false;
+    QvEncodePipe* made = pipe.release();
+    if (encoderOut) *encoderOut = made;
+    return QvStatus::ok;
+}
+
+int QvTask::linkStoredStream(const AnyDict& entry, int index, const QvDPipeList& decoders) {
+    QvEncodePipe& pipe = *encoder_;
+    QvOStream* stream = pipe.streamAt(index);
+    const int number = pipe.streamNr(stream);
+    QV_ASSERT(entry.empty() || entry.getInt32("type", 0) == stream->type);
+    const AnyVector sources = entry.getVector("sources");
+    if (sources.empty() || !sources.at(0).isDict()) {
+        qv_dbg()->warning("QvTask::restore: No source(s) defined for stream %d", index);
+        return QvStatus::ok;
+    }
+    const AnyDict& source = sources.at(0).asDict();
+    QV_ASSERT(source.get("file").isText() && source.get("stream").isPair());
+    const Pair address = source.get("stream").asPair();
+    QV_ASSERT(address.first == stream->type);
+    QvDecodePipe* decoder = decoders.findByFilename(source.get("file"), nullptr);
+    while (decoder && linkedTo(decoder, address.first, address.second) >= 0)
+        decoder = decoders.findByFilename(source.get("file"), decoder);
+    QV_ASSERT_MSG(decoder, "no available decoders, decoder must be cloned...");
+    if (!decoder->isSelected(address.first, address.second)) decoder->select(address.first, address.second);
+    ProcessParams params;
+    params.update(source.getDict("process"));
+    return link(decoder, address.first, address.second, number, params);
+}
+
+QvTask* QvTask::fromState(const AnyDict& state, QvDPipeList& decoders, QvEncodePipe** encoderOut, int options,
+                          QvFileOpenCb* callback, Any* error) {
+    auto task = std::make_unique<QvTask>();
+    QvEncodePipe* pipe = nullptr;
+    const int result = task->restore(state, decoders, &pipe, options, callback);
+    if (result == QvStatus::ok || result == QvStatus::warning) {
+        if (encoderOut) *encoderOut = pipe;
+        return task.release();
+    }
+    if (error) *error = Any(task->errorDesc());
+    task.reset();
+    delete pipe;
+    decoders.deleteAll();
+    return nullptr;
+}
+
+QvTask* QvTask::fromStateWithSource(const AnyDict& state, QvDecodePipe* decoder, int typeMask) {
+    QV_ASSERT(decoder);
+    std::unique_ptr<QvEncodePipe> pipe(QvEncodePipe::create());
+    QV_ASSERT_MSG(pipe, "Task.restore: could not create EncodePipe");
+    if (pipe->restore(state.getDict("encoder")) != QvStatus::ok) return nullptr;
+    for (int type : {1, 2}) removeSurplusStreams(*pipe, type, decoder->nrStreams(type));
+    auto task = std::make_unique<QvTask>();
+    task->setEncoder(pipe.get());
+    const AnyVector streams = state.getVector("streams");
+    for (int type : {1, 2, 4}) {
+        const int given = decoder->nrStreams(type), wanted = pipe->nrStreams(type);
+        if ((typeMask == 0 || (typeMask & type)) && wanted > 0 && given == 0) {
+            qv_log()->error("Can not create task, input file does not contain enough streams");
+            return nullptr;
+        }
+        if (given > wanted)
+            qv_dbg()->warning(
+                "[Task] fromStateWithSource - input contains more streams than required by output.");
+        for (int k = 0; k < std::min(given, wanted); ++k) {
+            decoder->select(type, k);
+            if (task->link(decoder, type, k, k) < 0) return nullptr;
+            const AnyDict params = storedProcessParams(streams, type, k);
+            ProcessParams own;
+            if (params.get("filters").isDict()) own.set("filters", params.get("filters"));
+            if (TransLink* link = task->getLinkForOutput(type, k)) link->setProcessParams(own);
+            if (params.getInt32("smartRender", 0) != 0)
+                task->paramsOf(type).set("smartRender", params.get("smartRender"));
+        }
+        removeSurplusStreams(*pipe, type, std::min(given, wanted));
+    }
+    task->setPostprocessCommand(state.get("postProcess"));
+    pipe.release();
+    return task.release();
+}

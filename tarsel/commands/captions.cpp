@@ -1,0 +1,109 @@
+// tarsel captions: what caption files hold, line by line.
+#include <algorithm>
+#include <cstdio>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include <nlohmann/json.hpp>
+
+#include "tarsel/commands/commands.h"
+#include "tarsel/host/console.h"
+#include "tarsel/source/source.h"
+#include "tarsel/words/failure.h"
+
+namespace {
+
+std::string timecodeText(const MediaTime& time, const QvFramerate& rate) {
+    char text[QvTimecode::textSize];
+    time.timecode(rate).pprint(text, false);
+    std::string shown = text;
+    if (rate.df()) shown[shown.rfind(':')] = ';';
+    return shown;
+}
+
+std::string bytesText(std::span<const QvCcBytePair> pairs) {
+    std::string text;
+    for (const auto& pair : pairs) {
+        char word[8];
+        std::snprintf(word, sizeof word, text.empty() ? "%02x%02x" : " %02x%02x", pair.byte1, pair.byte2);
+        text += word;
+    }
+    return text;
+}
+
+void printLine(std::span<const QvCcBytePair> pairs, const QvFramerate& rate, bool json) {
+    const int field = pairs.front().type() + 1;
+    const std::string time = timecodeText(pairs.front().time, rate), bytes = bytesText(pairs),
+                      text = qvCcText(pairs, pairs.front().type());
+    if (!json) {
+        print("%s\t%d\t%s\t%s\n", time.c_str(), field, bytes.c_str(), text.c_str());
+        return;
+    }
+    const nlohmann::ordered_json line = {{"time", time},
+                                         {"seconds", pairs.front().time.seconds()},
+                                         {"field", field},
+                                         {"bytes", bytes},
+                                         {"text", text}};
+    print("%s\n", line.dump().c_str());
+}
+
+// A line for each field and time.
+void printLines(const QvCcData& data, const QvFramerate& rate, bool json) {
+    const auto pairs = data.pairs();
+    for (auto begin = pairs.begin(); begin != pairs.end();) {
+        const auto end = std::find_if(begin, pairs.end(), [&](const auto& p) {
+            return p.type() != begin->type() || !(p.time == begin->time);
+        });
+        printLine({begin, end}, rate, json);
+        begin = end;
+    }
+}
+
+std::unique_ptr<QvDecodePipe> openFiles(const std::vector<std::string>& files) {
+    auto decoder = makeCodec<QvDecodePipe>("sccdec", 2);
+    decoder->setParam("dropFrameLines", 1);
+    AnyVector names;
+    for (const auto& file : files) {
+        if (!QvFile::isFile(Any(file.c_str())))
+            throw Failure(Exit::input, "can't open " + inQuotes(file) + ": no such file");
+        names.append(Any(file.c_str()));
+    }
+    decoder->setParam("filenames", names);
+    if (decoder->open() == QvStatus::ok) return decoder;
+    throw Failure(Exit::input, "can't open " + inQuotes(files.front()) +
+                                   ": it is no SCC file, or no line of it has captions");
+}
+
+void showCaptions(const std::vector<std::string>& files, bool json) {
+    QvFramerate rate = openFiles(files)->QvCodec::getParam("framerate").asFramerate();
+    printWarnings();
+    const bool dropFrame = rate.df();
+    QvCcData all;
+    for (size_t field = 0; field < files.size(); ++field) {
+        QvCcData one;
+        if (one.readScc(Any(files[field].c_str()), static_cast<int>(field), false, rate, &dropFrame, true) !=
+            0)
+            throw Failure(Exit::input, "can't read " + inQuotes(files[field]) + " again");
+        all.extend(one);
+    }
+    all.sort();
+    printLines(all, rate, json);
+}
+
+}  // namespace
+
+void addCaptions(CLI::App& app, Action& chosen) {
+    CLI::App* command =
+        app.add_subcommand("captions", "Show the captions of an SCC file: time, field, bytes, text");
+    struct Given {
+        std::vector<std::string> files;
+        bool json = false;
+    };
+    auto given = std::make_shared<Given>();
+    command->add_option("FILE", given->files, "SCC file of field 1, and one of field 2")
+        ->required()
+        ->expected(1, 2);
+    command->add_flag("--json", given->json, "Print JSON, one object a line");
+    command->callback([&chosen, given] { chosen = [given] { showCaptions(given->files, given->json); }; });
+}

@@ -1,0 +1,127 @@
+// One picture of a video, or a sheet of many, as a PNG.
+#include <algorithm>
+#include <cmath>
+#include <cstdio>
+
+#include "tarsel/commands/commands.h"
+#include "tarsel/host/outputs.h"
+#include "tarsel/picture/picturereader.h"
+#include "tarsel/source/source.h"
+#include "tarsel/words/failure.h"
+#include "tarsel/words/timespec.h"
+
+namespace {
+
+constexpr long long kTicks = 35280000;
+constexpr int kVideoFilter = 12;
+constexpr int kSheetWidth = 1920;  // pixels a contact sheet is at most wide
+constexpr int kGap = 8;            // pixels between its pictures
+
+struct Given {
+    std::string input, raw, at, output, sheet;
+    EffectOptions effects;
+    bool overwrite = false;
+    std::shared_ptr<Outputs> outputs;
+    Signals* signals = nullptr;
+};
+
+// Scales and converts pictures of one source to BGR3 of one size.
+class Shrinker {
+  public:
+    Shrinker(int width, int height) : scaler_(makeCodec<QvVideoFilter>("scaler", kVideoFilter)) {
+        setChecked(*scaler_, "outWidth", width, "--sheet");
+        setChecked(*scaler_, "outHeight", height, "--sheet");
+        setChecked(*scaler_, "FOURCC", static_cast<int>(QvFourcc::BGR3), "--sheet");
+        if (scaler_->open() != QvStatus::ok) throw Failure(Exit::failed, scaler_->errorDesc());
+    }
+    ~Shrinker() { scaler_->close(); }
+
+    void convert(const QvFrame& from, QvFrame& to) {
+        QvFrame copy(from);
+        if (scaler_->write(copy) != QvStatus::ok || scaler_->ready() == 0)
+            throw Failure(Exit::failed, std::string("can't scale the picture: ") + scaler_->errorDesc());
+        to = *scaler_->frame();
+        scaler_->next();
+    }
+
+  private:
+    std::unique_ptr<QvVideoFilter> scaler_;
+};
+
+void save(const QvFrame& picture, const Given& given) {
+    Outputs& outputs = *given.outputs;
+    const Signals::Watch watch(*given.signals, nullptr, [&] { outputs.discard(); });
+    const std::string name = outputs.begin("png");
+    if (picture.four_cc() != QvFourcc::BGR3) makeAnyCodec("scaler", kVideoFilter);  // says that it is missing
+    qv_log()->clear();
+    if (QvImage::saveFrame(picture, Any(name.c_str()), 0) != 0) {
+        AnyVector messages;
+        qv_log()->getAll(messages);
+        const std::string reason = messages.empty() ? "" : messages.back().asDict().getString("text", "");
+        throw Failure(Exit::output, "can't write " + inQuotes(given.output) + ": " +
+                                        inLine(outputs.withFinalNames(reason)));
+    }
+    outputs.commit("png");
+    std::fprintf(stderr, "tarsel: wrote %s\n", inQuotes(given.output).c_str());
+}
+
+void saveSheet(PictureReader& reader, const Given& given) {
+    const Size grid = parseSize(given.sheet, "--sheet");
+    if (grid.width > 32 || grid.height > 32)
+        throw Failure(Exit::usage, "--sheet: at most 32x32 pictures fit on a sheet");
+    const int width = ((kSheetWidth - kGap) / grid.width - kGap) & ~1;
+    const int height = std::max(2, static_cast<int>(std::lround(width / reader.format().aspect)) & ~1);
+    QvFrame sheet;
+    sheet.init(QvFourcc::BGR3, grid.width * (width + kGap) + kGap, grid.height * (height + kGap) + kGap);
+    sheet.setRGB(24, 24, 24);
+    Shrinker shrinker(width, height);
+    QvFrame cell;
+    const int count = grid.width * grid.height;
+    for (int i = 0; i < count; ++i) {
+        // The middle of each of `count` equal parts of the video.
+        shrinker.convert(reader.at((2LL * i + 1) * reader.frames() / (2LL * count)), cell);
+        sheet.clip(cell, 0, 0, kGap + i % grid.width * (width + kGap),
+                   kGap + i / grid.width * (height + kGap), width, height);
+    }
+    save(sheet, given);
+}
+
+void frame(Given& given) {
+    given.effects.check();
+    const Any extension = QvFile::getExt(Any(given.output.c_str()), true);
+    if (!(extension == "png"))
+        throw Failure(Exit::usage, "-o " + inQuotes(given.output) + ": a picture is a .png file");
+    Source source(given.input, given.raw);
+    given.outputs = std::make_shared<Outputs>(given.output, "-o", std::vector{given.input}, given.overwrite);
+    if (source.decoder().nrStreams(1) == 0)
+        throw Failure(Exit::input, inQuotes(given.input) + " has no picture");
+    source.selectAll();
+    PictureReader reader(source, given.effects);
+    if (reader.pipe()) checkFilterFiles(*reader.pipe(), {given.input}, given.outputs.get(), given.overwrite);
+    if (!given.sheet.empty()) return saveSheet(reader, given);
+    const auto rate = source.frameRate();
+    const MediaTime at = given.at.empty() ? MediaTime(0LL, kTicks) : parseTime(given.at, rate, "--at");
+    if (rate && at.position(*rate) >= source.decoder().nrFrames(0))
+        throw Failure(Exit::usage, "--at " + given.at + " lies behind the end of " + inQuotes(given.input) +
+                                       " (" + formatTime(source.duration()) + ")");
+    const long long number = rate ? at.position(reader.format().rate) : 0;
+    save(reader.at(std::min(number, reader.frames() - 1)), given);
+}
+
+}  // namespace
+
+void addFrame(CLI::App& app, Action& chosen, Signals& signals) {
+    CLI::App* command = app.add_subcommand("frame", "Save one picture of a video, or a contact sheet");
+    auto given = std::make_shared<Given>();
+    given->signals = &signals;
+    command->add_option("FILE", given->input, "A file, or testgen:...")->required();
+    command->add_option("--at", given->at, "The instant: SS.mmm, HH:MM:SS, 120f, HH:MM:SS:FF")
+        ->type_name("TIME");
+    command->add_option("--sheet", given->sheet, "A sheet of COLUMNSxROWS pictures")->type_name("NxM");
+    command->add_option("--raw", given->raw, "Format of a raw file: size=WxH,pixel=FORMAT,rate=R")
+        ->type_name("K=V,...");
+    command->add_option("-o,--output", given->output, "The picture")->type_name("FILE.png")->required();
+    addEffectOptions(*command, given->effects);
+    command->add_flag("-y,--overwrite", given->overwrite, "Overwrite an existing picture");
+    command->callback([&chosen, given] { chosen = [given] { frame(*given); }; });
+}

@@ -1,0 +1,177 @@
+#include <cstdio>
+
+#include <nlohmann/json.hpp>
+
+#include "tarsel/commands/commands.h"
+#include "tarsel/host/console.h"
+#include "tarsel/source/source.h"
+#include "tarsel/words/failure.h"
+#include "tarsel/words/timespec.h"
+
+namespace {
+
+using Json = nlohmann::ordered_json;
+
+std::string text(const Any& value) {
+    const Any narrow = value.isWString() ? value.toString() : value;
+    return narrow.isString() ? narrow.asString() : "";
+}
+
+// File names need not be UTF-8; JSON does.
+std::string validUtf8(const std::string& bytes) {
+    return Json::parse(Json(bytes).dump(-1, ' ', false, Json::error_handler_t::replace)).get<std::string>();
+}
+
+// Of captions and subtitles. A rate says nothing about subtitles with clock times.
+void describeText(const AnyDict& p, Json& stream) {
+    if (p.get("textEncoding").isText()) stream["encoding"] = text(p.get("textEncoding"));
+    if (p.get("count").isInt()) stream["subtitles"] = p.get("count").toInt64();
+    if (p.get("framerate").isFramerate() && p.getInt32("format", QvSubtitles::SUB) == QvSubtitles::SUB)
+        stream["timecode"] = text(p.get("framerate").asFramerate().desc(true, false));
+    const Any& end = p.isSet("end") ? p.get("end") : p.get("last");
+    if (!p.get("first").isMediaTime() || !end.isMediaTime()) return;
+    stream["first_s"] = p.get("first").asMediaTime().seconds();
+    stream["last_s"] = end.asMediaTime().seconds();
+}
+
+Json describeStream(const QvDecodePipe& decoder, int type, int number) {
+    AnyDict p;
+    decoder.getStreamParams(type, number, p);
+    Json stream;
+    stream["type"] = type == 1 ? "video" : type == 2 ? "audio" : "subpicture";
+    stream["number"] = number;
+    if (p.get("codec").isText()) stream["codec"] = text(p.get("codec"));
+    const auto integer = [&](const char* key, const char* name) {
+        if (p.get(key).isInt()) stream[name] = p.get(key).toInt64();
+    };
+    if (type == 1) {
+        stream["pixel"] = fourccText(static_cast<unsigned>(p.getInt32("FOURCC", 0)));
+        integer("width", "width");
+        integer("height", "height");
+        if (p.get("framerate").isFramerate()) {
+            const QvFramerate rate = p.get("framerate").asFramerate();
+            stream["rate"] = std::to_string(rate.rate().num) + "/" + std::to_string(rate.rate().den);
+            stream["scan"] = rate.interlaced() == 0 ? "progressive"
+                             : rate.isTopFirst()    ? "top first"
+                                                    : "bottom first";
+        }
+        if (p.get("frameAspect").isDouble()) stream["frame_aspect"] = p.get("frameAspect").asDouble();
+        integer("frames", "frames");
+        integer("nrViews", "views");
+    } else if (type == 4) {
+        describeText(p, stream);
+        integer("frames", "frames");
+        integer("pairs", "pairs");
+    } else {
+        integer("samplerate", "samplerate");
+        integer("channels", "channels");
+        integer("bitsPerSample", "bits");
+        integer("samples", "samples");
+    }
+    if (p.get("duration").isDouble()) stream["duration_s"] = p.get("duration").asDouble();
+    return stream;
+}
+
+Json describe(const Source& source) {
+    Json file;
+    file["file"] = validUtf8(source.name());
+    file["decoder"] = source.decoder().name();
+    if (source.bytes() >= 0) file["bytes"] = source.bytes();
+    const double duration = source.duration();
+    file["duration_s"] = duration < 0 ? Json(nullptr) : Json(duration);
+    file["streams"] = Json::array();
+    for (int type : {1, 2, 4})
+        for (int i = 0; i < source.decoder().nrStreams(type); ++i)
+            file["streams"].push_back(describeStream(source.decoder(), type, i));
+    const std::string damage = source.damage();
+    if (!damage.empty()) file["damage"] = damage;
+    return file;
+}
+
+std::string streamLine(const Json& s) {
+    const auto number = [&](const char* key) { return std::to_string(s[key].get<long long>()); };
+    std::string line = s.value("codec", "");
+    const auto add = [&](const std::string& part) { line += (line.empty() ? "" : ", ") + part; };
+    if (s["type"] == "video") {
+        if (s["pixel"] != line) add(s["pixel"].get<std::string>());
+        if (s.contains("width") && s.contains("height")) add(number("width") + "x" + number("height"));
+        if (s.contains("rate")) add(s["rate"].get<std::string>() + " fps " + s["scan"].get<std::string>());
+        if (s.contains("frames")) add(number("frames") + " frames");
+        if (s.contains("views") && s["views"] != 1) add(number("views") + " views");
+    } else if (s["type"] == "subpicture") {
+        if (s.contains("encoding")) add(s["encoding"].get<std::string>());
+        if (s.contains("timecode")) add(s["timecode"].get<std::string>());
+        if (s.contains("subtitles"))
+            add(number("subtitles") + (s["subtitles"] == 1 ? " subtitle" : " subtitles"));
+        if (s.contains("frames")) add(number("frames") + " frames");
+        if (s.contains("pairs")) add(number("pairs") + " pairs");
+        if (s.contains("first_s"))
+            add(formatTime(s["first_s"].get<double>()) + " to " + formatTime(s["last_s"].get<double>()));
+        return line;
+    } else {
+        if (s.contains("samplerate")) add(number("samplerate") + " Hz");
+        if (s.contains("channels")) add(number("channels") + " ch");
+        if (s.contains("bits")) add(number("bits") + " bit");
+        if (s.contains("samples")) add(number("samples") + " samples");
+    }
+    if (s.contains("duration_s")) add(formatTime(s["duration_s"].get<double>()));
+    return line;
+}
+
+void printFile(const Json& file) {
+    print("%s\n", inQuotes(file["file"].get<std::string>()).c_str());
+    print("  decoder   %s\n", file["decoder"].get<std::string>().c_str());
+    if (file.contains("bytes"))
+        print("  size      %s\n", formatBytes(file["bytes"].get<long long>()).c_str());
+    if (!file["duration_s"].is_null())
+        print("  duration  %s\n", formatTime(file["duration_s"].get<double>()).c_str());
+    for (const auto& s : file["streams"])
+        print("  %s %lld   %s\n", s["type"].get<std::string>().c_str(), s["number"].get<long long>(),
+              streamLine(s).c_str());
+    if (file.contains("damage")) print("  damaged   %s\n", file["damage"].get<std::string>().c_str());
+}
+
+struct Given {
+    std::vector<std::string> files;
+    std::string raw;
+    bool json = false;
+};
+
+// Looks at every file, also behind one that can't be used.
+void info(const Given& given) {
+    Json all = Json::array();
+    std::vector<std::string> failures;
+    for (const auto& name : given.files) {
+        try {
+            const Source source(name, given.raw);
+            all.push_back(describe(source));
+            if (!given.json) printFile(all.back());
+            if (all.back().contains("damage"))
+                failures.push_back(inQuotes(name) + " is damaged: " + source.damage());
+            else
+                printWarnings();
+            qv_log()->clear();
+        } catch (const Failure& failure) {
+            if (failure.exit() != Exit::input) throw;
+            failures.push_back(failure.what());
+        }
+    }
+    if (given.json) print("%s\n", all.dump(2).c_str());
+    flushOutput();
+    if (failures.empty()) return;
+    for (size_t i = 0; i + 1 < failures.size(); ++i)
+        std::fprintf(stderr, "tarsel: %s\n", failures[i].c_str());
+    throw Failure(Exit::input, failures.back());
+}
+
+}  // namespace
+
+void addInfo(CLI::App& app, Action& chosen) {
+    CLI::App* command = app.add_subcommand("info", "Show streams, formats and durations of files");
+    auto given = std::make_shared<Given>();
+    command->add_option("FILE", given->files, "Files, or testgen:...")->required();
+    command->add_option("--raw", given->raw, "Format of a raw file: size=WxH,pixel=FORMAT,rate=R")
+        ->type_name("K=V,...");
+    command->add_flag("--json", given->json, "Print JSON, one array of files");
+    command->callback([&chosen, given] { chosen = [given] { info(*given); }; });
+}

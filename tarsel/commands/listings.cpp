@@ -1,0 +1,161 @@
+// What this installation can do: modules, presets and formats.
+#include <map>
+
+#include <nlohmann/json.hpp>
+
+#include "tarsel/commands/commands.h"
+#include "tarsel/host/console.h"
+#include "tarsel/words/timespec.h"
+
+namespace {
+
+using Json = nlohmann::ordered_json;
+
+const char* kindName(int kind) {
+    switch (kind) {
+        case 2: return "decoder";
+        case 3: return "encode pipe";
+        case 5: return "sink";
+        case 6: return "audio encoder";
+        case 7: return "video encoder";
+        case 10: return "multiplexer";
+        case 12: return "video filter";
+        case 13: return "audio filter";
+        case 14: return "video pipe";
+        case 16: return "audio pipe";
+    }
+    return "other";
+}
+
+Json modules() {
+    Json list = Json::array();
+    for (int i = 0; i < qv_registry()->nrModules(0); ++i) {
+        QvModule& module = *qv_registry()->module(i);
+        std::unique_ptr<QvCodec> codec(qv_registry()->newCodec(module.name()));
+        Json row;
+        row["name"] = module.name();
+        row["kind"] = kindName(module.getAttr("type").toInt32());
+        row["description"] = module.desc();
+        row["plugin"] = module.plugin() ? module.plugin()->name() : "";
+        row["usable"] = codec != nullptr;
+        list.push_back(std::move(row));
+    }
+    return list;
+}
+
+Json presets() {
+    Json list = Json::array();
+    const QvPresetList& all = qvPresetMgr()->builtinPresets();
+    const auto names = [](const AnyVector& modules) {
+        Json row = Json::array();
+        for (int i = 0; i < modules.size(); ++i) row.push_back(modules.at(i).asString());
+        return row;
+    };
+    for (int i = 0; i < all.size(); ++i) {
+        const QvPreset preset = all.preset(i);
+        list.push_back({{"name", preset.name()},
+                        {"symbol", preset.symbol()},
+                        {"video", names(preset.videoCodecs())},
+                        {"audio", names(preset.audioCodecs())},
+                        {"muxers", names(preset.muxers())}});
+    }
+    return list;
+}
+
+struct Output {
+    const char* extensions;
+    const char* what;
+    const char* module;  // what it needs
+};
+
+constexpr Output kOutputs[] = {
+    {"wav", "PCM sound, 8 to 24 bits, 1 to 8 channels", "rawmux"},
+    {"png", "one picture a frame, NAME#0.png; sound beside them in NAME.wav", "scaler"},
+    {"raw yuv rgb i420 yv12 yuy2 yuyv uyvy bgr3 bgr4 bgra argb v210",
+     "raw frames one behind the other; sound beside them in NAME.wav", "rawmux"},
+    {"avi", "uncompressed pictures and sound in one file", "rawavimux"},
+};
+
+Json formats() {
+    Json result;
+    Json inputs = Json::array();
+    for (int i = 0; i < qv_registry()->nrModules(0); ++i) {
+        QvModule& module = *qv_registry()->module(i);
+        if (module.getAttr("type").toInt32() != 2) continue;
+        const Any exts = module.getAttr("exts");
+        if (!exts.isVector() || exts.asVector().empty()) continue;
+        std::unique_ptr<QvCodec> codec(qv_registry()->newCodec(module.name()));
+        if (!codec) continue;
+        Json names = Json::array();
+        for (int k = 0; k < exts.asVector().size(); ++k) names.push_back(exts.asVector().at(k).asString());
+        inputs.push_back({{"extensions", names}, {"decoder", module.name()}, {"description", module.desc()}});
+    }
+    result["inputs"] = inputs;
+    result["outputs"] = Json::array();
+    for (const Output& output : kOutputs)
+        if (std::unique_ptr<QvCodec>(qv_registry()->newCodec(output.module)))
+            result["outputs"].push_back({{"extensions", output.extensions}, {"description", output.what}});
+    result["pixels"] = Json::array();
+    for (const QvPixelFormat& format : qvPixelFormats())
+        result["pixels"].push_back({{"fourcc", fourccText(format.fourcc)}});
+    return result;
+}
+
+std::string joined(const Json& list) {
+    std::string text;
+    for (const auto& item : list) text += (text.empty() ? "" : " ") + item.get<std::string>();
+    return text;
+}
+
+void add(CLI::App& app, Action& chosen, const char* name, const char* help, Json (*make)(),
+         void (*show)(const Json&)) {
+    CLI::App* command = app.add_subcommand(name, help);
+    auto json = std::make_shared<bool>(false);
+    command->add_flag("--json", *json, "Print JSON");
+    command->callback([&chosen, json, make, show] {
+        chosen = [json, make, show] {
+            const Json data = make();
+            if (*json)
+                print("%s\n", data.dump(2).c_str());
+            else
+                show(data);
+        };
+    });
+}
+
+}  // namespace
+
+void addModules(CLI::App& app, Action& chosen) {
+    add(app, chosen, "modules", "List the modules of the library and its plug-ins", modules,
+        [](const Json& list) {
+            for (const auto& m : list)
+                print("%-13s %-14s %s%s\n", m["name"].get<std::string>().c_str(),
+                      m["kind"].get<std::string>().c_str(), m["description"].get<std::string>().c_str(),
+                      m["usable"].get<bool>() ? "" : "  (not usable)");
+        });
+}
+
+void addPresets(CLI::App& app, Action& chosen) {
+    add(app, chosen, "presets", "List the presets that the installed modules allow", presets,
+        [](const Json& list) {
+            for (const auto& p : list)
+                print("%-24s video %s; audio %s; %s\n", p["name"].get<std::string>().c_str(),
+                      joined(p["video"]).c_str(), joined(p["audio"]).c_str(), joined(p["muxers"]).c_str());
+        });
+}
+
+void addFormats(CLI::App& app, Action& chosen) {
+    add(app, chosen, "formats", "List what can be read and written", formats, [](const Json& data) {
+        print("Inputs\n");
+        for (const auto& i : data["inputs"])
+            print("  %-10s %s: %s\n", i["decoder"].get<std::string>().c_str(),
+                  i["description"].get<std::string>().c_str(), joined(i["extensions"]).c_str());
+        print("Outputs\n");
+        for (const auto& o : data["outputs"])
+            print("  %s\n      %s\n", o["extensions"].get<std::string>().c_str(),
+                  o["description"].get<std::string>().c_str());
+        print("Pixel formats\n ");
+        for (const auto& p : data["pixels"]) print(" %s", p["fourcc"].get<std::string>().c_str());
+        print("\n");
+    });
+}

@@ -1,0 +1,74 @@
+#include "tarsel/commands/commands.h"
+#include "tarsel/job/job.h"
+#include "tarsel/words/timespec.h"
+
+namespace {
+
+// Options as they were given; they are parsed once the command runs.
+struct Given {
+    JobOptions job;
+    std::string samplerate, channels, bits, progress = "auto";
+};
+
+void resolve(Given& given) {
+    JobOptions& job = given.job;
+    job.effects.check();
+    if (!given.samplerate.empty())
+        job.samplerate = static_cast<int>(parseNumber(given.samplerate, 1000, 768000, "--samplerate"));
+    if (!given.channels.empty())
+        job.channels = static_cast<int>(parseNumber(given.channels, 1, 8, "--channels"));
+    if (!given.bits.empty()) job.bits = static_cast<int>(parseNumber(given.bits, 8, 24, "--bits"));
+    if (job.bits && *job.bits % 8 != 0)
+        throw Failure(Exit::usage, "--bits: " + inQuotes(given.bits) + " is not 8, 16 or 24");
+    if (!job.muxer.empty() && job.muxer != "nullmux" && job.muxer != "rawmux" && job.muxer != "rawavimux")
+        throw Failure(Exit::module, "--muxer: there is no multiplexer " + inQuotes(job.muxer) +
+                                        " for this tool." +
+                                        suggestion(job.muxer, {"rawmux", "rawavimux", "nullmux"}));
+    if (given.progress == "json") job.progress = ProgressMode::json;
+    if (given.progress == "none") job.progress = ProgressMode::off;
+}
+
+void transcode(Given& given, Signals& signals) {
+    resolve(given);
+    Job job(given.job, signals);
+    if (!given.job.saveTask.empty()) job.saveTask();
+    if (given.job.dryRun) return job.printPlan();
+    job.run();
+}
+
+}  // namespace
+
+void addTranscode(CLI::App& app, Action& chosen, Signals& signals) {
+    CLI::App* command = app.add_subcommand("transcode", "Read INPUTs, convert, and write OUTPUT");
+    auto given = std::make_shared<Given>();
+    JobOptions& job = given->job;
+    command->add_option("INPUT", job.inputs, "Files, or testgen:size=1280x720,rate=25,duration=10")
+        ->required();
+    command->add_option("-o,--output", job.output, "What to write; the extension says how")
+        ->type_name("FILE");
+    command->add_option("--raw", job.raw, "Format of a raw input: size=WxH,pixel=FORMAT,rate=R")
+        ->type_name("K=V,...");
+    command->add_option("--from", job.from, "First instant taken: SS.mmm, HH:MM:SS, 120f, HH:MM:SS:FF")
+        ->type_name("TIME");
+    command->add_option("--to", job.to, "First instant not taken")->type_name("TIME");
+    command->add_option("--samplerate", given->samplerate, "Samples a second")->type_name("N");
+    command->add_option("--channels", given->channels, "Channels of the sound, 1 to 8")->type_name("N");
+    command->add_option("--bits", given->bits, "Bits of a sample: 8, 16 or 24")->type_name("N");
+    command->add_option("--muxer", job.muxer, "nullmux: do everything but write")->type_name("NAME");
+    command
+        ->add_option(
+            "--post", job.post,
+            "A command run afterwards; %i and %o stand for the inputs and outputs, %o1 for the first")
+        ->type_name("CMD");
+    command->add_option("--save-task", job.saveTask, "Write the job as a task file")->type_name("FILE");
+    command->add_option("--progress", given->progress, "auto, json (lines on stderr) or none")
+        ->check(CLI::IsMember({"auto", "json", "none"}));
+    command->add_flag("--split-channels", job.splitChannels, "One WAV file a channel");
+    command->add_flag("--accept-partial", job.acceptPartial, "Take what is there of a damaged input");
+    command->add_flag("--dry-run", job.dryRun, "Print the plan and do nothing");
+    command->add_flag("-y,--overwrite", job.overwrite, "Overwrite existing outputs");
+    command->add_flag("-q,--quiet", job.quiet, "Say nothing but errors");
+    addEffectOptions(*command, job.effects);
+    command->callback(
+        [&chosen, &signals, given] { chosen = [&signals, given] { transcode(*given, signals); }; });
+}

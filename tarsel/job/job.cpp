@@ -1,0 +1,365 @@
+#include "tarsel/job/job.h"
+
+#include <algorithm>
+#include <cstdio>
+#include <filesystem>
+#include <new>
+
+#include "tarsel/words/timespec.h"
+
+namespace fs = std::filesystem;
+
+namespace {
+
+constexpr long long kTicks = 35280000;
+constexpr int kVideo = 1, kAudio = 2;
+constexpr int kVideoFilter = 12, kAudioFilter = 13;
+
+struct KindRow {
+    const char* extension;
+    OutputKind kind;
+};
+
+constexpr KindRow kKinds[] = {
+    {"wav", OutputKind::wav},  {"png", OutputKind::pictures}, {"avi", OutputKind::avi},
+    {"raw", OutputKind::raw},  {"yuv", OutputKind::raw},      {"rgb", OutputKind::raw},
+    {"i420", OutputKind::raw}, {"yv12", OutputKind::raw},     {"yuy2", OutputKind::raw},
+    {"yuyv", OutputKind::raw}, {"uyvy", OutputKind::raw},     {"bgr3", OutputKind::raw},
+    {"bgr4", OutputKind::raw}, {"bgra", OutputKind::raw},     {"argb", OutputKind::raw},
+    {"v210", OutputKind::raw},
+};
+
+int intParam(const QvDecodePipe& decoder, int type, int stream, const char* name) {
+    const Any value = decoder.getStreamParam(type, stream, name);
+    return value.isInt32() ? value.asInt32() : 0;
+}
+
+}  // namespace
+
+long long JobStream::bytes(long long units) const {
+    if (type == kAudio) return units * channels * ((bits + 7) / 8);
+    QvFrame frame;
+    if (frame.init(fourcc, width, height) != QvStatus::ok) throw std::bad_alloc();
+    return units * frame.total_bytes();
+}
+
+Job::Job(const JobOptions& options, Signals& signals) : options_(options), signals_(signals) {
+    chooseOutput();
+    openInputs();
+    planStreams();
+    planPoints();
+    planLengths();
+    planFilters();
+    buildPipe();
+    checkNames();
+}
+
+Job::~Job() = default;
+
+bool Job::hasVideo() const {
+    return std::any_of(streams_.begin(), streams_.end(), [](const auto& s) { return s.type == kVideo; });
+}
+
+void Job::chooseOutput() {
+    if (options_.muxer == "nullmux") {
+        kind_ = OutputKind::nothing;
+        return;
+    }
+    if (options_.output.empty()) throw Failure(Exit::usage, "no output; give its name with -o FILE");
+    const std::string extension = QvFile::getExt(Any(options_.output.c_str()), true).asString();
+    const auto* row = std::find_if(std::begin(kKinds), std::end(kKinds),
+                                   [&](const KindRow& r) { return extension == r.extension; });
+    std::error_code error;
+    const auto status = fs::status(options_.output, error);
+    const bool device = fs::exists(status) && !fs::is_regular_file(status) && !fs::is_directory(status);
+    if (row == std::end(kKinds) && !device) {
+        std::vector<std::string> known;
+        for (const auto& r : kKinds) known.push_back(r.extension);
+        throw Failure(Exit::usage,
+                      "-o " + inQuotes(options_.output) + ": " +
+                          (extension.empty() ? "it has no extension that says what to write"
+                                             : "no output has the extension " + inQuotes(extension)) +
+                          "." + suggestion(extension, known) + " 'tarsel formats' lists all");
+    }
+    kind_ = row == std::end(kKinds) ? OutputKind::raw : row->kind;
+    outputs_ = std::make_unique<Outputs>(options_.output, "-o", options_.inputs, options_.overwrite);
+    if (kind_ == OutputKind::pictures) outputs_->checkNumbered("png");
+    if (options_.splitChannels) outputs_->checkNumbered("wav");
+}
+
+void Job::openInputs() {
+    if (options_.inputs.empty()) throw Failure(Exit::usage, "no input; give a file or testgen:...");
+    // Beside a raw file there may be others, such as its sound.
+    const bool onlyOne = options_.inputs.size() == 1;
+    const auto isRaw = [&](const auto& name) { return onlyOne || !Source::describesItself(name); };
+    if (!options_.raw.empty() && std::none_of(options_.inputs.begin(), options_.inputs.end(), isRaw))
+        throw Failure(Exit::usage, "--raw describes a raw file; no input is one");
+    for (const auto& name : options_.inputs) {
+        sources_.push_back(std::make_unique<Source>(name, isRaw(name) ? options_.raw : ""));
+        sources_.back()->selectAll();
+    }
+    checkDamage();
+}
+
+// A cut input is refused unless the user takes what is there.
+void Job::checkDamage() {
+    for (const auto& source : sources_) {
+        const std::string damage = source->damage();
+        if (damage.empty()) continue;
+        if (!options_.acceptPartial)
+            throw Failure(Exit::input, inQuotes(source->name()) + " is damaged: " + damage +
+                                           "; --accept-partial takes what is there");
+        warnings_.push_back(inQuotes(source->name()) + " is damaged: " + damage);
+    }
+}
+
+void Job::planStreams() {
+    for (const auto& source : sources_)
+        for (int type : {kVideo, kAudio}) {
+            if (type == kVideo && kind_ == OutputKind::wav) continue;
+            if (outputs_ && outputs_->isDevice() && !streams_.empty()) continue;
+            for (int i = 0; i < source->decoder().nrStreams(type); ++i) planStream(*source, type, i);
+        }
+    if (streams_.empty())
+        throw Failure(Exit::input, kind_ == OutputKind::wav
+                                       ? "no input has sound for " + inQuotes(options_.output)
+                                       : std::string("no input has a picture or sound"));
+    checkPicture();
+    // As captions, of which raw pictures hold none.
+    for (const auto& source : sources_)
+        if (std::none_of(streams_.begin(), streams_.end(),
+                         [&](const auto& s) { return s.source == source.get(); }))
+            warnings_.push_back("nothing of " + inQuotes(source->name()) + " goes into the output");
+}
+
+void Job::checkPicture() const {
+    const bool sound = kind_ == OutputKind::wav || kind_ == OutputKind::nothing;
+    if (!sound && !hasVideo() && !outputs_->isDevice())
+        throw Failure(Exit::input, "no input has a picture for " + inQuotes(options_.output) +
+                                       "; sound alone is written as .wav");
+}
+
+void Job::planStream(Source& source, int type, int number) {
+    const QvDecodePipe& decoder = source.decoder();
+    JobStream stream{};
+    stream.type = type;
+    stream.source = &source;
+    stream.decStream = number;
+    stream.encStream = static_cast<int>(
+        std::count_if(streams_.begin(), streams_.end(), [&](const auto& s) { return s.type == type; }));
+    if (type == kVideo) {
+        stream.picture =
+            std::make_shared<PictureEffects>(options_.effects, source, number, kind_ == OutputKind::pictures);
+        const PictureFormat& out = stream.picture->out();
+        stream.width = out.width;
+        stream.height = out.height;
+        stream.fourcc = out.fourcc;
+        stream.rate = out.rate;
+    } else {
+        stream.samplerate = options_.samplerate.value_or(intParam(decoder, type, number, "samplerate"));
+        stream.channels = options_.channels.value_or(intParam(decoder, type, number, "channels"));
+        stream.bits = options_.bits.value_or(intParam(decoder, type, number, "bitsPerSample"));
+    }
+    streams_.push_back(stream);
+}
+
+// The end of a stream: an instant whose position is the count of its frames or samples. Not every rate
+// divides the timescale, so the exact one may lie between two ticks.
+MediaTime Job::endOf(const JobStream& stream) {
+    QvDecodePipe& decoder = stream.source->decoder();
+    const MediaTime end = decoder.duration(stream.type, stream.decStream);
+    const Any rate = decoder.getStreamParam(stream.type, stream.decStream,
+                                            stream.type == kVideo ? "framerate" : "samplerate");
+    const bool before = stream.type == kVideo
+                            ? end.position(rate.asFramerate()) < decoder.nrFrames(stream.decStream)
+                            : end.position(rate.toInt32()) < decoder.nrSamples(stream.decStream);
+    return before ? end + MediaTime(1) : end;
+}
+
+void Job::planPoints() {
+    const auto picture = std::find_if(streams_.begin(), streams_.end(),
+                                      [](const JobStream& stream) { return stream.type == kVideo; });
+    for (JobStream& stream : streams_) {
+        // Frames beside a sound of its own file are those of the picture.
+        auto rate = stream.source->frameRate();
+        if (!rate && picture != streams_.end()) rate = picture->source->frameRate();
+        const MediaTime length = endOf(stream);
+        const std::string end =
+            "the end of " + inQuotes(stream.source->name()) + " (" + formatTime(length.seconds()) + ")";
+        stream.in = MediaTime(0LL, kTicks);
+        stream.out = length;
+        if (!options_.from.empty()) stream.in = parseTime(options_.from, rate, "--from");
+        if (!options_.to.empty()) stream.out = parseTime(options_.to, rate, "--to");
+        if (stream.out <= stream.in && !options_.to.empty())
+            throw Failure(Exit::usage, "--to " + options_.to + " is not behind " +
+                                           (options_.from.empty() ? "the start" : "--from " + options_.from));
+        if (stream.in >= length && !options_.from.empty())
+            throw Failure(Exit::usage, "--from " + options_.from + " lies behind " + end);
+        if (stream.out > length) {
+            if (stream.type == kVideo || !hasVideo())
+                warnings_.push_back("--to " + options_.to + " lies behind " + end + "; stopped there");
+            stream.out = length;
+        }
+    }
+}
+
+void Job::planLengths() {
+    const JobStream* video = nullptr;
+    for (JobStream& stream : streams_) {
+        const Any inRate = stream.source->decoder().getStreamParam(
+            stream.type, stream.decStream, stream.type == kVideo ? "framerate" : "samplerate");
+        if (stream.type == kVideo) {
+            const QvRatio from = inRate.asFramerate().rate();
+            stream.inUnits = stream.out.position(from) - stream.in.position(from);
+            stream.expected = QvRatio::multyplyByRatio(stream.inUnits, stream.rate.rate(), from);
+            // A whole number of pairs goes into a halving.
+            if (std::abs(2.0 * stream.rate.rate() - static_cast<double>(from)) < 1e-4 && stream.inUnits % 2)
+                stream.expected = (stream.inUnits + 1) / 2;
+            if (stream.expected < 1 || stream.inUnits < 1)
+                throw Failure(Exit::usage, "there is no frame of " + inQuotes(stream.source->name()) +
+                                               " between " + formatTime(stream.in.seconds()) + " and " +
+                                               formatTime(stream.out.seconds()));
+            video = &stream;
+        }
+    }
+    for (JobStream& stream : streams_) {
+        if (stream.type != kAudio) continue;
+        stream.own = stream.out.position(stream.samplerate) - stream.in.position(stream.samplerate);
+        stream.expected = stream.own;
+        if (video) {
+            stream.expected =
+                QvUtil::samplesForFrames(static_cast<int>(video->expected), video->rate, stream.samplerate);
+            stream.frame = QvUtil::samplesForFrames(1, video->rate, stream.samplerate) + 1;
+        }
+        stream.inUnits = stream.expected;
+    }
+}
+
+std::string Job::primaryExtension() const {
+    switch (kind_) {
+        case OutputKind::wav: return "wav";
+        case OutputKind::avi: return "avi";
+        case OutputKind::pictures: return "png";
+        default: return hasVideo() ? "raw" : "wav";
+    }
+}
+
+void Job::buildPipe() {
+    pipe_.reset(QvEncodePipe::create());
+    if (!pipe_) throw Failure(Exit::module, "this installation can't write any output");
+    if (kind_ == OutputKind::avi) {
+        if (!qvPresetMgr()->profileAvailable(QvProfile::aviRaw))
+            throw Failure(Exit::module, "this installation has no AVI output");
+        pipe_->applyPreset(QvProfile::aviRaw, 0);
+    }
+    pipe_->clearStreams();
+    const char* muxer = kind_ == OutputKind::nothing ? "nullmux"
+                        : kind_ == OutputKind::avi   ? "rawavimux"
+                                                     : "rawmux";
+    if (std::string_view(pipe_->getMuxer() ? pipe_->getMuxer()->name() : "") != muxer &&
+        pipe_->setMuxer(muxer) != QvStatus::ok)
+        throw Failure(Exit::module,
+                      std::string("the multiplexer ") + muxer + " can't be used: " + pipe_->errorDesc());
+    QvMuxer& m = *pipe_->getMuxer();
+    if (kind_ == OutputKind::pictures) {
+        m.setParam("splitVideo", 1);
+        m.setParam("rawAsPng", 1);
+    }
+    if (options_.splitChannels) setChecked(m, "splitAudio", 1, "--split-channels");
+    for (JobStream& stream : streams_) addStream(stream);
+}
+
+void Job::addStream(JobStream& stream) {
+    const char* module = stream.type == kVideo ? "rawvenc" : "rawaenc";
+    if (pipe_->addStream(stream.type, Any(module)) < 0)
+        throw Failure(Exit::output, std::string("the output takes no further ") +
+                                        (stream.type == kVideo ? "picture" : "sound") + ": " +
+                                        pipe_->errorDesc());
+    QvEncoder& encoder = *pipe_->encoder(stream.type, stream.encStream);
+    if (stream.type == kVideo) {
+        setChecked(encoder, "type", static_cast<int>(stream.fourcc), "--pixel");
+        setChecked(encoder, "width", stream.width, "--size");
+        setChecked(encoder, "height", stream.height, "--size");
+        setChecked(encoder, "framerate", Any(stream.rate), "--rate");
+    } else {
+        setChecked(encoder, "samplerate", stream.samplerate, "--samplerate");
+        setChecked(encoder, "channels", stream.channels, "--channels");
+        setChecked(encoder, "bitsPerSample", stream.bits, "--bits");
+    }
+}
+
+// Names that exist are refused before any work; what is written beside the output counts as well.
+void Job::checkNames() const {
+    if (!outputs_ || outputs_->isDevice()) return;
+    pipe_->setFilename(Any(outputs_->hiddenName(primaryExtension()).c_str()));
+    const Any names = pipe_->getMuxer()->QvCodec::getParam("filenames");
+    if (!names.isVector()) return;
+    for (int i = 0; i < names.asVector().size(); ++i)
+        outputs_->checkFinal(outputs_->finalName(names.asVector().at(i).asString(), "raw"));
+}
+
+// What was asked for has to have something that it works on.
+void Job::checkEffects() const {
+    if (const std::string option = options_.effects.given(); !option.empty() && !hasVideo())
+        throw Failure(Exit::usage, option + ": this job has no picture");
+    for (const auto& spec : options_.effects.filters) {
+        const int type = filterType(spec);
+        if (std::any_of(streams_.begin(), streams_.end(), [&](const auto& s) { return s.type == type; }))
+            continue;
+        throw Failure(Exit::usage, "--filter " + spec.substr(0, spec.find(':')) + ": this job has no " +
+                                       (type == kVideo ? "picture" : "sound"));
+    }
+}
+
+void Job::planFilters() {
+    checkEffects();
+    for (JobStream& stream : streams_) {
+        if (!options_.from.empty() || !options_.to.empty())
+            stream.params.setInOutPoints(InOutPoints(stream.in, stream.out));
+        stream.type == kVideo ? planPicture(stream) : planSound(stream);
+    }
+    takeWarnings();
+}
+
+void Job::planPicture(JobStream& stream) const {
+    if (kind_ == OutputKind::pictures) makeAnyCodec("scaler", kVideoFilter);
+    const FiltersState state = stream.picture->filters(stream.expected, false);
+    if (!state.empty()) stream.params.setFilters(state);
+    const auto pipe = tryPipe(stream.picture->job(state));
+    if (pipe) checkFilterFiles(*pipe, options_.inputs, outputs_.get(), options_.overwrite);
+    stream.chain = describe(pipe.get());
+}
+
+void Job::planSound(JobStream& stream) const {
+    const QvDecodePipe& decoder = stream.source->decoder();
+    const auto differs = [&](const char* name, int wanted) {
+        return intParam(decoder, stream.type, stream.decStream, name) != wanted;
+    };
+    FiltersState state;
+    for (const auto& spec : options_.effects.filters) {
+        if (filterType(spec) != kAudio) continue;
+        state.appendFilter(spec.c_str(), filterState(spec));
+        stream.chain.push_back(spec);
+    }
+    if (!state.empty()) stream.params.setFilters(state);
+    if (differs("samplerate", stream.samplerate)) makeAnyCodec("srconvert", kAudioFilter);
+    if (differs("channels", stream.channels)) makeAnyCodec("chconvert", kAudioFilter);
+    // Filters work on 32 bits.
+    if (differs("bitsPerSample", stream.bits) || stream.params.filters())
+        makeAnyCodec("aquant", kAudioFilter);
+}
+
+// What the engine told its user, each line once.
+void Job::takeWarnings() {
+    constexpr int warning = 4;
+    AnyVector messages;
+    qv_log()->getAll(messages);
+    for (int i = 0; i < messages.size(); ++i) {
+        const AnyDict& message = messages.at(i).asDict();
+        const std::string text = inLine(message.getString("text", ""));
+        if (message.getInt32("type", 0) == warning &&
+            std::find(warnings_.begin(), warnings_.end(), text) == warnings_.end())
+            warnings_.push_back(text);
+    }
+    qv_log()->clear();
+}

@@ -1,0 +1,105 @@
+// A transcode of the tool: resolved from options to a plan, then run, checked and put in place.
+#pragma once
+
+#include <memory>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include <qvplugcore/qvplugcore.h>
+
+#include "tarsel/host/outputs.h"
+#include "tarsel/host/signals.h"
+#include "tarsel/job/progress.h"
+#include "tarsel/picture/picture.h"
+#include "tarsel/source/source.h"
+#include "tarsel/words/failure.h"
+#include "tarsel/words/timespec.h"
+
+struct JobOptions {
+    std::vector<std::string> inputs;
+    std::string output, raw, from, to, muxer, post, saveTask;
+    EffectOptions effects;
+    std::optional<int> samplerate, channels, bits;
+    ProgressMode progress = ProgressMode::automatic;
+    bool overwrite = false, splitChannels = false, dryRun = false, acceptPartial = false, quiet = false;
+};
+
+// What an output name stands for.
+enum class OutputKind { raw, wav, pictures, avi, nothing };
+
+// One stream from an input to the output, with what it will be.
+struct JobStream {
+    int type;  // 1 video, 2 audio
+    Source* source;
+    int decStream, encStream;
+    // The format of the output.
+    std::shared_ptr<const PictureEffects> picture;  // of video
+    int width = 0, height = 0;
+    unsigned fourcc = 0;
+    QvFramerate rate;
+    int samplerate = 0, channels = 0, bits = 0;
+    MediaTime in, out;       // in the source
+    long long inUnits = 0;   // frames or samples between the points
+    long long expected = 0;  // frames or samples of the output
+    long long own = 0;       // audio: samples of the output that the source itself has
+    long long frame = 0;     // audio: most samples that belong to one frame of the picture; 0 without one
+    long long written = -1;  // after the run
+    ProcessParams params;
+    std::vector<std::string> chain;          // a line for each filter
+    long long bytes(long long units) const;  // without headers
+};
+
+class Job {
+  public:
+    Job(const JobOptions& options, Signals& signals);
+    ~Job();
+
+    // Prints the plan to the standard output.
+    void printPlan() const;
+    void saveTask();
+    // Runs, checks and commits. Throws Failure.
+    void run();
+
+  private:
+    class Runner;
+
+    void openInputs();
+    void chooseOutput();
+    void planStreams();
+    void planStream(Source& source, int type, int number);
+    static MediaTime endOf(const JobStream& stream);
+    void planPoints();
+    void planLengths();
+    void planFilters();
+    void planPicture(JobStream& stream) const;
+    void planSound(JobStream& stream) const;
+    void checkEffects() const;
+    void takeWarnings();
+    void checkPicture() const;
+    void buildPipe();
+    void addStream(JobStream& stream);
+    void checkNames() const;
+    void checkDamage();
+    void checkSpace() const;
+    void link(Runner& runner) const;
+    int runLinked(Runner& runner, Progress& progress);
+    [[noreturn]] void stopped(Exit signalled) const;
+    [[noreturn]] void fail(Runner& runner) const;
+    void checkResult();
+    void checkFiles() const;
+    void report(const std::vector<std::string>& names) const;
+    void runPost(const std::vector<std::string>& names) const;
+    void showWarnings() const;
+    std::string primaryExtension() const;
+    bool hasVideo() const;
+
+    JobOptions options_;
+    Signals& signals_;
+    OutputKind kind_ = OutputKind::raw;
+    std::vector<std::unique_ptr<Source>> sources_;
+    std::vector<JobStream> streams_;
+    std::unique_ptr<Outputs> outputs_, taskFile_;
+    std::unique_ptr<QvEncodePipe> pipe_;
+    std::vector<std::string> warnings_;
+};

@@ -1,0 +1,80 @@
+// What was written, compared with what the job asked for.
+#include <algorithm>
+#include <filesystem>
+
+#include "tarsel/job/job.h"
+
+namespace fs = std::filesystem;
+
+namespace {
+
+std::vector<fs::path> ofExtension(const std::vector<fs::path>& files, const char* extension) {
+    std::vector<fs::path> found;
+    std::copy_if(files.begin(), files.end(), std::back_inserter(found),
+                 [&](const fs::path& file) { return file.extension() == extension; });
+    return found;
+}
+
+// Samples that the header of a file speaks of and its data holds; -1 when it can't be read.
+long long samplesOf(const fs::path& file) {
+    const std::unique_ptr<QvDecodePipe> decoder(QvDecFactory::decodePipe(Any(file.c_str())));
+    if (!decoder || decoder->nrStreams(2) != 1) return -1;
+    AnyDict params;
+    decoder->getStreamParams(2, 0, params);
+    return params.get("truncated").isTrue() ? -1 : decoder->nrSamples(0);
+}
+
+[[noreturn]] void differs(const std::string& name, long long found, long long wanted, const char* unit) {
+    if (found < 0)
+        throw Failure(Exit::check, inQuotes(name) + " can't be read back; nothing was left behind");
+    throw Failure(Exit::check, inQuotes(name) + " is not what was asked for: " + std::to_string(found) +
+                                   " instead of " + std::to_string(wanted) + " " + unit +
+                                   "; nothing was left behind");
+}
+
+}  // namespace
+
+// An input that ended early is told apart from a result that is wrong.
+void Job::checkResult() {
+    for (const JobStream& s : streams_) {
+        const char* unit = s.type == 1 ? "frames" : "samples";
+        if (s.written > s.expected) differs(options_.output, s.written, s.expected, unit);
+        if (s.written == s.expected) continue;
+        // Sound that has all been written may end within the last frame of the picture.
+        if (s.written == s.own && s.expected - s.written <= s.frame) continue;
+        const std::string line = inQuotes(s.source->name()) + " ended early: " + std::to_string(s.written) +
+                                 " of " + std::to_string(s.expected) + " " + unit + " were read";
+        if (!options_.acceptPartial)
+            throw Failure(Exit::input, line + "; --accept-partial keeps what is there");
+        warnings_.push_back(line);
+    }
+    if (outputs_ && !outputs_->isDevice()) checkFiles();
+}
+
+void Job::checkFiles() const {
+    const std::vector<fs::path> files = outputs_->written();
+    std::error_code error;
+    size_t sound = 0, raw = 0;
+    const auto sounds = ofExtension(files, ".wav"), raws = ofExtension(files, ".raw");
+    long long pictures = 0;
+    for (const JobStream& s : streams_) {
+        if (s.type == 1 && kind_ == OutputKind::pictures) pictures += s.written;
+        if (s.type == 1 && kind_ == OutputKind::raw) {
+            const auto bytes = raw < raws.size() ? fs::file_size(raws[raw++], error) : 0;
+            if (error || static_cast<long long>(bytes) != s.bytes(s.written))
+                differs(options_.output, error ? -1 : static_cast<long long>(bytes), s.bytes(s.written),
+                        "bytes");
+        }
+        if (s.type != 2 || kind_ == OutputKind::avi) continue;
+        for (int part = 0; part < (options_.splitChannels ? s.channels : 1); ++part) {
+            const fs::path file = sound < sounds.size() ? sounds[sound++] : fs::path();
+            const long long samples = samplesOf(file);
+            if (samples != s.written)
+                differs(file.empty() ? options_.output : outputs_->finalName(file, "raw"), samples, s.written,
+                        "samples");
+        }
+    }
+    const auto found = static_cast<long long>(ofExtension(files, ".png").size());
+    if (kind_ == OutputKind::pictures && found != pictures)
+        differs(options_.output, found, pictures, "pictures");
+}

@@ -1,0 +1,256 @@
+// Running a job: the transcoder with its callbacks, what is shown meanwhile, and how it ends.
+#include <algorithm>
+#include <atomic>
+#include <condition_variable>
+#include <cstdio>
+#include <mutex>
+#include <optional>
+
+#include "tarsel/host/keyboard.h"
+#include "tarsel/job/job.h"
+#include "tarsel/job/post.h"
+#include "tarsel/words/timespec.h"
+
+// The transcoder of a job. Its callbacks run on the engine's worker; the tool waits on its own thread.
+class Job::Runner : public QvTranscoder {
+  public:
+    Runner(Job& job, Progress& progress) : job_(job), progress_(progress) {}
+    ~Runner() override { QvTranscoder::stop(); }
+
+    int cbProcess() override {
+        if (stop_.load(std::memory_order_relaxed)) return 1;
+        if (progress_.due()) progress_.update(state("running"));
+        return 0;
+    }
+
+    // The counts have to be taken before the links close.
+    int cbMuxClose(QvMuxer*) override {
+        for (JobStream& stream : job_.streams_)
+            if (TransLink* link = getLinkForOutput(stream.type, stream.encStream))
+                stream.written = link->outProcessed();
+        takeFilterFailure();
+        last_ = state("closing");
+        return 0;
+    }
+
+    void cbPaused(bool paused) override { progress_.show(state(paused ? "paused" : "running")); }
+
+    void cbDone(int result) override {
+        std::lock_guard guard(lock_);
+        result_ = result;
+        done_ = true;
+        changed_.notify_all();
+    }
+
+    // The result of cbDone. `slow` runs when a requested stop takes a while.
+    template <class Slow>
+    int wait(Slow slow) {
+        std::unique_lock guard(lock_);
+        changed_.wait(guard, [this] { return done_ || stop_; });
+        if (!done_ && !changed_.wait_for(guard, kSlowStop, [this] { return done_; })) slow();
+        changed_.wait(guard, [this] { return done_; });
+        return result_;
+    }
+
+    void requestStop() {
+        {
+            std::lock_guard guard(lock_);
+            stop_ = true;
+            changed_.notify_all();
+        }
+        if (isPaused()) unpause();
+    }
+
+    // Why the run failed: a link knows it better than the log, and that better than the run.
+    std::string reason() const {
+        for (const JobStream& stream : job_.streams_)
+            if (const TransLink* link = getLinkForOutput(stream.type, stream.encStream);
+                link && link->errorCode() != 0 && *link->errorDesc())
+                return link->errorDesc();
+        AnyVector messages;
+        qv_log()->getAll(messages);
+        for (int i = 0; i < messages.size(); ++i)
+            if (messages.at(i).asDict().getInt32("type", 0) == kErrorLine)
+                return messages.at(i).asDict().getString("text", "");
+        return *errorDesc() ? errorDesc() : "the job failed; --log FILE tells more";
+    }
+
+    void togglePause() { isPaused() ? unpause() : pause(); }
+
+    ProgressState state(const char* name) const {
+        ProgressState s;
+        s.state = name;
+        for (const JobStream& stream : job_.streams_) {
+            const TransLink* link = getLinkForOutput(stream.type, stream.encStream);
+            if (!link) continue;
+            const long long units = std::max(link->outProcessed(), 0LL);
+            if (stream.expected > 0)
+                s.part = std::min(1.0, static_cast<double>(units) / static_cast<double>(stream.expected));
+            const double rate =
+                stream.type == 1 ? static_cast<double>(stream.rate.rate()) : stream.samplerate;
+            s.outSeconds = static_cast<double>(units) / rate;
+            if (stream.type == 1) s.frame = units;
+            break;
+        }
+        return s;
+    }
+    const ProgressState& last() const { return last_; }
+    // Why a filter could not do its work; the others went on without it.
+    const std::optional<Failure>& filterFailure() const { return filterFailure_; }
+
+  private:
+    void takeFilterFailure() {
+        for (const JobStream& stream : job_.streams_) {
+            const TransLink* link = getLinkForOutput(stream.type, stream.encStream);
+            const Any& filters = stream.params.get("filters");
+            if (!link || stream.type != 1 || !filters.isDict()) continue;
+            for (const Any& name : FiltersState(filters.asDict()).names(true))
+                for (int i = 0; const QvCodec* filter = link->filter(name.asString(""), i); ++i)
+                    if (filter->errorCode() != 0 && !filterFailure_) filterFailure_ = failureOf(*filter);
+        }
+    }
+
+    static Failure failureOf(const QvCodec& filter) {
+        const bool writes = !filterFile(filter, QV_GUI_FILESELECT_SAVE).empty();
+        return {writes ? Exit::output : Exit::failed, "the filter " + std::string(filter.name()) + ": " +
+                                                          inLine(filter.errorDesc()) +
+                                                          (writes ? "" : "; nothing was left behind")};
+    }
+
+    static constexpr auto kSlowStop = std::chrono::seconds(1);
+    static constexpr int kErrorLine = 2;  // type of a message
+
+    Job& job_;
+    Progress& progress_;
+    ProgressState last_;
+    std::optional<Failure> filterFailure_;
+    std::atomic<bool> stop_{false};
+    std::mutex lock_;
+    std::condition_variable changed_;
+    bool done_ = false;
+    int result_ = 0;
+};
+
+void Job::checkSpace() const {
+    if (!outputs_ || outputs_->isDevice()) return;
+    const long long space = QvFile::freeSpace(Any(outputs_->hiddenName(primaryExtension()).c_str()));
+    long long need = 0;
+    if (kind_ != OutputKind::pictures)
+        for (const JobStream& stream : streams_) need += stream.bytes(stream.expected);
+    if (space >= 0 && need > space)
+        throw Failure(Exit::output, "can't write " + inQuotes(outputs_->output().string()) + ": it needs " +
+                                        formatBytes(need) + ", the disk has " + formatBytes(space) + " free");
+}
+
+void Job::link(Runner& runner) const {
+    runner.setEncoder(pipe_.get());
+    runner.setParam("startDelay", 0);
+    AnyDict off;
+    off.set("off", 1);
+    runner.setParam("progress", off);
+    for (const JobStream& s : streams_)
+        if (runner.link(&s.source->decoder(), s.type, s.decStream, s.encStream, s.params) < 0)
+            throw Failure(Exit::failed, inLine(runner.errorDesc()));
+}
+
+int Job::runLinked(Runner& runner, Progress& progress) {
+    if (outputs_) pipe_->setFilename(Any(outputs_->begin(primaryExtension()).c_str()));
+    progress.start();
+    qv_log()->clear();
+    int result = runner.transcode(false);
+    if (result == QvStatus::ok || result == QvStatus::warning) {
+        Keyboard keyboard(progress.onTerminal(), [&] { runner.togglePause(); });
+        result = runner.wait([&] {
+            if (!options_.quiet) std::fputs("tarsel: stopping; a second signal ends it at once\n", stderr);
+        });
+    }
+    ProgressState end = runner.last();
+    end.state = signals_.received() != Exit::done ? "stopped" : result == 0 ? "done" : "failed";
+    progress.finish(end);
+    return result;
+}
+
+void Job::run() {
+    checkSpace();
+    Progress progress(options_.quiet ? ProgressMode::off : options_.progress, "task 1 of 1  ");
+    std::vector<std::string> names;
+    {
+        Runner runner(*this, progress);
+        link(runner);
+        const Signals::Watch watch(
+            signals_, [&] { runner.requestStop(); },
+            [&] {
+                if (outputs_) outputs_->discard();
+            });
+        const int result = runLinked(runner, progress);
+        if (const Exit signalled = signals_.received(); signalled != Exit::done) stopped(signalled);
+        if (result != 0 && result != QvStatus::endOfStream) fail(runner);
+        if (runner.filterFailure()) throw *runner.filterFailure();
+        takeWarnings();
+        checkResult();
+        if (outputs_) names = outputs_->commit("raw");
+    }
+    showWarnings();
+    if (!options_.quiet) report(names);
+    if (!options_.post.empty()) runPost(names);
+}
+
+void Job::stopped(Exit signalled) const {
+    if (outputs_) outputs_->discard();
+    const bool device = outputs_ && outputs_->isDevice();
+    throw Failure(signalled, device ? "stopped; " + inQuotes(options_.output) + " has a part of it"
+                                    : "stopped; nothing was left behind");
+}
+
+// The reason stands in the object that failed: a decoder, one of the output's members, where the file knows
+// what the system said, a filter, or a link.
+void Job::fail(Runner& runner) const {
+    for (const auto& source : sources_)
+        if (source->decoder().errorCode() < 0 && source->decoder().errorCode() != QvStatus::endOfStream)
+            throw Failure(Exit::input, "can't read " + inQuotes(source->name()) + ": " +
+                                           inLine(source->decoder().errorDesc()));
+    std::string reason;
+    const auto take = [&](const QvCodec* codec) {
+        if (reason.empty() && codec && codec->errorCode() != 0) reason = codec->errorDesc();
+    };
+    for (const JobStream& s : streams_)
+        if (const QvBufStream* file = pipe_->getMuxer()->stream(s.type, s.encStream); file && reason.empty())
+            reason = file->ioErrorText();
+    for (const JobStream& s : streams_) take(pipe_->encoder(s.type, s.encStream));
+    take(pipe_->getMuxer());
+    take(pipe_->sink());
+    take(pipe_.get());
+    if (!reason.empty() && outputs_)
+        throw Failure(Exit::output, "can't write " + inQuotes(outputs_->output().string()) + ": " +
+                                        inLine(outputs_->withFinalNames(reason)));
+    if (runner.filterFailure()) throw *runner.filterFailure();
+    reason = runner.reason();
+    throw Failure(Exit::failed, inLine(outputs_ ? outputs_->withFinalNames(reason) : reason));
+}
+
+void Job::showWarnings() const {
+    if (options_.quiet) return;
+    for (const auto& warning : warnings_) std::fprintf(stderr, "tarsel: warning: %s\n", warning.c_str());
+}
+
+void Job::report(const std::vector<std::string>& names) const {
+    std::string line = "wrote " + (names.empty() ? "nothing" : inQuotes(names.front()));
+    if (names.size() == 2) line += " and " + inQuotes(names[1]);
+    if (names.size() > 2) line += " and " + std::to_string(names.size() - 1) + " more files";
+    for (const JobStream& s : streams_)
+        line += ", " + std::to_string(s.written) + (s.type == 1 ? " frame" : " sample") +
+                (s.written == 1 ? "" : "s");
+    if (!warnings_.empty())
+        line +=
+            " (" + std::to_string(warnings_.size()) + (warnings_.size() == 1 ? " warning)" : " warnings)");
+    std::fprintf(stderr, "tarsel: %s\n", line.c_str());
+}
+
+void Job::runPost(const std::vector<std::string>& names) const {
+    const int status = execute_process(Any(postCommand(options_.post, options_.inputs, names).c_str()));
+    if (status == 0) return;
+    throw Failure(Exit::failed, "the command of --post " +
+                                    (status < 0 ? std::string("can't be run")
+                                                : "ended with status " + std::to_string(status)) +
+                                    (names.empty() ? "" : "; " + inQuotes(names.front()) + " is complete"));
+}

@@ -1,0 +1,56 @@
+#include "tarsel/job/post.h"
+
+#include <filesystem>
+
+#include <qvplugcore/qvplugcore.h>
+
+namespace {
+
+std::string quoted(const std::string& name) { return QvFile::shellQuote(Any(name.c_str())).asString(); }
+
+// The name that the digits at `at` count from 1, all names when they count none of them. Moves `at` behind
+// them.
+std::string counted(const std::vector<std::string>& names, const std::string& command, size_t& at) {
+    size_t number = 0;
+    for (; at < command.size() && command[at] >= '0' && command[at] <= '9'; ++at) {
+        const size_t next = number * 10 + static_cast<size_t>(command[at] - '0');
+        if (next == 0 || next > names.size()) break;
+        number = next;
+    }
+    if (number > 0) return quoted(names[number - 1]);
+    std::string all;
+    for (const auto& name : names) all += (all.empty() ? "" : " ") + quoted(name);
+    return all;
+}
+
+std::string baseName(const std::vector<std::string>& outputs) {
+    const std::string stem = std::filesystem::path(outputs.front()).stem().string();
+    return outputs.size() > 1 ? stem.substr(0, stem.rfind('#')) : stem;
+}
+
+std::string folderName(const std::string& output) {
+    const std::string folder = std::filesystem::path(output).parent_path().string();
+    return folder.empty() ? "./" : folder + "/";
+}
+
+}  // namespace
+
+std::string postCommand(const std::string& command, const std::vector<std::string>& inputs,
+                        const std::vector<std::string>& outputs) {
+    std::string result;
+    for (size_t i = 0; i < command.size();) {
+        const std::string two = command.substr(i, 2), three = command.substr(i, 3);
+        if (three == "%op" && !outputs.empty()) {
+            result += quoted(folderName(outputs.front()));
+            i += 3;
+        } else if (three == "%ob" && !outputs.empty()) {
+            result += quoted(baseName(outputs));
+            i += 3;
+        } else if (two == "%i" || two == "%o") {
+            result += counted(two == "%i" ? inputs : outputs, command, i += 2);
+        } else {
+            result += command[i++];
+        }
+    }
+    return result;
+}

@@ -1,0 +1,99 @@
+// --crop: which part of a picture is kept.
+#include <charconv>
+#include <cmath>
+
+#include "tarsel/picture/overlays.h"
+#include "tarsel/words/failure.h"
+#include "tarsel/words/timespec.h"
+
+namespace {
+
+constexpr int kLeast = 4;  // pixels that have to be left
+
+[[noreturn]] void refuse(const std::string& text, const std::string& why) {
+    throw Failure(Exit::usage, "--crop: " + inQuotes(text) + " " + why);
+}
+
+std::string sizeText(int width, int height) { return std::to_string(width) + "x" + std::to_string(height); }
+
+// What a cut keeps together: pixels that share their chroma, and in interlaced pictures the fields.
+struct Grid {
+    int columns, rows;
+};
+
+Grid gridOf(const PictureFormat& picture) {
+    const QvPixelFormat* format = qvPixelFormat(picture.fourcc);
+    if (!format) return {1, 1};
+    const bool quarter = format->chroma == QvChroma::quarter;
+    const bool pairs = quarter || format->chroma == QvChroma::half || format->group == 'y' ||
+                       format->fourcc == QvFourcc::Y216 || format->fourcc == QvFourcc::v210;
+    const int fields = picture.rate.interlaced() ? 2 : 1;
+    return {pairs ? 2 : 1, (quarter ? 2 : 1) * fields};
+}
+
+// "+20" and "-20" of "+20-20": the distance of a box from one edge or the other.
+int takeOffset(std::string_view& rest, int room, const std::string& text) {
+    int value = 0;
+    const char* begin = rest.data() + 1;
+    const auto [end, error] = std::from_chars(begin, rest.data() + rest.size(), value);
+    if (rest.size() < 2 || (rest[0] != '+' && rest[0] != '-') || *begin == '-' || error != std::errc())
+        refuse(text, "is not a part of a picture: use WxH, WxH+X+Y or W:H");
+    const bool fromEnd = rest[0] == '-';
+    rest.remove_prefix(static_cast<size_t>(end - rest.data()));
+    return fromEnd ? room - value : value;
+}
+
+// The largest box of an aspect, in the middle.
+QvRect ofAspect(const std::string& text, size_t colon, const PictureFormat& picture) {
+    const auto part = [](std::string_view digits) { return parseNumber(digits, 1, 10000, "--crop"); };
+    const double wanted = static_cast<double>(part(std::string_view(text).substr(0, colon))) /
+                          static_cast<double>(part(std::string_view(text).substr(colon + 1)));
+    int width = picture.width, height = picture.height;
+    if (wanted < picture.aspect)
+        width = static_cast<int>(std::lround(width * wanted / picture.aspect));
+    else
+        height = static_cast<int>(std::lround(height * picture.aspect / wanted));
+    const Grid grid = gridOf(picture);
+    width = width / grid.columns * grid.columns;
+    height = height / grid.rows * grid.rows;
+    if (width < kLeast || height < kLeast) refuse(text, "leaves nothing of the picture");
+    const int x = (picture.width - width) / 2 / grid.columns * grid.columns;
+    const int y = (picture.height - height) / 2 / grid.rows * grid.rows;
+    return QvRect(x, y, x + width, y + height);
+}
+
+void check(const std::string& text, const QvRect& box, const PictureFormat& picture) {
+    const std::string of = sizeText(picture.width, picture.height);
+    if (box.width() > picture.width || box.height() > picture.height || box.left() < 0 || box.top() < 0 ||
+        box.right() > picture.width || box.bottom() > picture.height)
+        refuse(text, "lies beyond the picture, which is " + of);
+    if (box.width() < kLeast || box.height() < kLeast) refuse(text, "leaves less than 4x4 pixels");
+    const Grid grid = gridOf(picture);
+    if (box.left() % grid.columns != 0 || box.width() % grid.columns != 0)
+        refuse(text, "cuts between pixels that belong together; use an even width and X");
+    if (box.top() % grid.rows != 0 || (grid.rows > 1 && box.height() % 2 != 0))
+        refuse(text,
+               "cuts between lines that belong together; use an even height, and a Y that is a multiple of " +
+                   std::to_string(grid.rows));
+}
+
+}  // namespace
+
+QvRect parseCrop(const std::string& text, const PictureFormat& picture) {
+    if (const size_t colon = text.find(':'); colon != std::string::npos)
+        return ofAspect(text, colon, picture);
+    const size_t signs = std::min(text.find_first_of("+-"), text.size());
+    const Size size = parseSize(std::string_view(text).substr(0, signs), "--crop");
+    const Grid grid = gridOf(picture);
+    int x = (picture.width - size.width) / 2 / grid.columns * grid.columns;
+    int y = (picture.height - size.height) / 2 / grid.rows * grid.rows;
+    if (std::string_view rest = std::string_view(text).substr(signs); !rest.empty()) {
+        x = takeOffset(rest, picture.width - size.width, text);
+        if (rest.empty()) refuse(text, "is not a part of a picture: use WxH, WxH+X+Y or W:H");
+        y = takeOffset(rest, picture.height - size.height, text);
+        if (!rest.empty()) refuse(text, "is not a part of a picture: use WxH, WxH+X+Y or W:H");
+    }
+    const QvRect box(x, y, x + size.width, y + size.height);
+    check(text, box, picture);
+    return box;
+}

@@ -1,0 +1,280 @@
+#include "tarsel/picture/overlays.h"
+
+#include <algorithm>
+#include <charconv>
+#include <cmath>
+#include <filesystem>
+
+#include "tarsel/words/failure.h"
+#include "tarsel/words/keyvalues.h"
+#include "tarsel/words/timespec.h"
+
+namespace {
+
+constexpr int kVideoFilter = 12;
+constexpr int kLinesOfText = 18;  // of subtitles that would fill a picture
+constexpr int kLeastText = 14;    // pixels
+constexpr int kShadow = 2;        // fontEffect
+
+void checkFile(const std::string& name, const std::string& option) {
+    std::error_code error;
+    const auto status = std::filesystem::status(name, error);
+    const auto refuse = [&](const std::string& why) {
+        throw Failure(Exit::input, option + ": can't open " + inQuotes(name) + ": " + why);
+    };
+    if (std::filesystem::is_directory(status)) refuse("this is a folder");
+    if (!std::filesystem::exists(status))
+        refuse(error && error != std::errc::no_such_file_or_directory ? inLine(error.message())
+                                                                      : "no such file");
+    if (!std::filesystem::is_regular_file(status)) refuse("this is no regular file");
+}
+
+constexpr struct {
+    const char* name;
+    int rgb;
+} kColours[] = {
+    {"white", 0xFFFFFF}, {"black", 0},         {"red", 0xFF0000},     {"green", 0x00FF00},
+    {"blue", 0x0000FF},  {"yellow", 0xFFFF00}, {"magenta", 0xFF00FF}, {"cyan", 0x00FFFF},
+};
+
+int parseColour(const std::string& text, const std::string& option) {
+    for (const auto& colour : kColours)
+        if (text == colour.name) return colour.rgb;
+    const std::string digits = text.substr(text.rfind('#', 0) == 0 ? 1 : 0);
+    int rgb = 0;
+    const auto [end, error] = std::from_chars(digits.data(), digits.data() + digits.size(), rgb, 16);
+    if (digits.size() != 6 || digits[0] == '-' || error != std::errc() || end != digits.data() + 6)
+        throw Failure(Exit::usage,
+                      option + ": " + inQuotes(text) +
+                          " is not a colour: use RRGGBB in hexadecimal digits, or a name such as yellow");
+    return rgb;
+}
+
+double parseDecimal(const std::string& text, double low, double high, const std::string& option) {
+    double value = 0;
+    const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), value);
+    if (error == std::errc() && end == text.data() + text.size() && value >= low && value <= high)
+        return value;
+    char range[64];
+    std::snprintf(range, sizeof range, " is not a number from %g to %g", low, high);
+    throw Failure(Exit::usage, option + ": " + inQuotes(text) + range);
+}
+
+// Of the names that a parameter offers; a number stands for itself.
+int parseEncoding(const std::string& text, const QvCodec& filter, const std::string& option) {
+    const auto lower = [](std::string name) {
+        std::transform(name.begin(), name.end(), name.begin(),
+                       [](unsigned char c) { return std::tolower(c); });
+        return name;
+    };
+    const Any range = filter.getParam("encodingRange");
+    std::vector<std::string> known;
+    for (int i = 0; range.isVector() && i < range.asVector().size(); ++i) {
+        const AnyDict& row = range.asVector().at(i).asDict();
+        const int identifier = row.getInt32("identifier", 0);
+        known.push_back(lower(row.getString("name", "")));
+        if (lower(text) == known.back() || text == std::to_string(identifier)) return identifier;
+    }
+    throw Failure(Exit::usage,
+                  option + ": there is no encoding " + inQuotes(text) + "." + suggestion(lower(text), known));
+}
+
+int parseEffect(const std::string& text, const std::string& option) {
+    const std::vector<std::string> names = {"none", "outline", "shadow", "hard"};
+    const auto found = std::find(names.begin(), names.end(), text);
+    if (found == names.end())
+        throw Failure(Exit::usage, option + ": there is no effect " + inQuotes(text) + "." +
+                                       suggestion(text, names) + " Use none, outline, shadow or hard");
+    return static_cast<int>(found - names.begin());
+}
+
+// A name and the numbers behind its last "@", if these are numbers.
+struct Placed {
+    std::string file;
+    int x = 0, y = 0;
+    std::optional<double> opacity;
+};
+
+template <class Number>
+bool takeNumber(std::string_view& text, Number& value) {
+    const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), value);
+    if (error != std::errc()) return false;
+    text.remove_prefix(static_cast<size_t>(end - text.data()));
+    if (text.empty()) return true;
+    if (text[0] != ',' || text.size() == 1) return false;
+    text.remove_prefix(1);
+    return true;
+}
+
+Placed parsePlaced(const std::string& spec) {
+    const size_t at = spec.rfind('@');
+    if (at == std::string::npos) return {spec, 0, 0, {}};
+    std::string_view place = std::string_view(spec).substr(at + 1);
+    Placed placed{spec.substr(0, at), 0, 0, {}};
+    double opacity = 1;
+    bool good = takeNumber(place, placed.x) && !place.empty() && takeNumber(place, placed.y);
+    if (good && !place.empty()) {
+        good = takeNumber(place, opacity) && place.empty() && opacity >= 0 && opacity <= 1;
+        placed.opacity = opacity;
+    }
+    if (good) return placed;
+    // A name may hold an "@" as well.
+    std::error_code error;
+    if (std::filesystem::exists(spec, error)) return {spec, 0, 0, {}};
+    throw Failure(Exit::usage,
+                  "--logo: " + inQuotes(spec) + ": " + inQuotes(std::string_view(spec).substr(at)) +
+                      " is no place: use FILE@X,Y or FILE@X,Y,OPACITY with an opacity from 0 to 1");
+}
+
+// Any other file is one with moving pictures.
+bool isStill(const std::string& name) { return QvFile::getExt(Any(name.c_str()), true) == "png"; }
+
+void setColour(QvCodec& filter, int rgb, const std::string& option) {
+    setChecked(filter, "colorR", rgb >> 16, option);
+    setChecked(filter, "colorG", rgb >> 8 & 255, option);
+    setChecked(filter, "colorB", rgb & 255, option);
+}
+
+// The frame number that a run begins with, and whether it is told as drop frame.
+void setStart(QvCodec& filter, const std::string& text, const PictureFormat& picture, bool alone) {
+    const std::string option = "--timecode: start";
+    const MediaTime start = parseTime(text, picture.rate, option);
+    const bool drop = text.find(';') != std::string::npos;
+    const bool ntsc = picture.rate.is29p() || picture.rate.is59i() || picture.rate.is59p();
+    if (drop && !ntsc)
+        throw Failure(Exit::usage, option + ": " + inQuotes(text) + " is drop frame, which " +
+                                       std::string(picture.rate.desc(true, true).asString()) +
+                                       " frames a second don't have; use ':'");
+    if (drop) setChecked(filter, "dropFrame", 1, option);
+    setChecked(filter, "start", alone ? "InPoint" : "FirstInputFrame", option);
+    setChecked(filter, "startOffset", static_cast<int>(-start.position(picture.rate)), option);
+}
+
+}  // namespace
+
+AnyDict stateOf(const QvCodec& codec) {
+    AnyDict state;
+    codec.store(state);
+    state.set("_on", 1);
+    return state;
+}
+
+bool logoIsMoving(const std::string& spec) { return !isStill(parsePlaced(spec).file); }
+
+AnyDict logoState(const std::string& spec, const PictureFormat& picture) {
+    const std::string option = "--logo";
+    const Placed placed = parsePlaced(spec);
+    if (placed.file.empty()) throw Failure(Exit::usage, option + ": " + inQuotes(spec) + " names no file");
+    checkFile(placed.file, option);
+    const auto filter = makeAnyCodec(isStill(placed.file) ? "logo" : "animatedlogo", kVideoFilter);
+    if (std::abs(static_cast<long long>(placed.x)) >= picture.width ||
+        std::abs(static_cast<long long>(placed.y)) >= picture.height)
+        throw Failure(Exit::usage, option + ": " + inQuotes(spec) + " lies beyond the picture, which is " +
+                                       std::to_string(picture.width) + "x" + std::to_string(picture.height));
+    setChecked(*filter, "filename", placed.file.c_str(), option);
+    setChecked(*filter, "xpos", placed.x, option);
+    setChecked(*filter, "ypos", placed.y, option);
+    if (placed.opacity) setChecked(*filter, "alpha", *placed.opacity, option);
+    return stateOf(*filter);
+}
+
+namespace {
+
+void setFont(QvCodec& filter, const std::string& file, const std::string& what) {
+    checkFile(file, what);
+    setChecked(filter, "font_filename", file.c_str(), what);
+}
+
+int parseTextSize(const std::string& text, const std::string& what) {
+    return static_cast<int>(parseNumber(text, 1, 4096, what));
+}
+
+// One key of --subtitle-style.
+void setStyle(QvCodec& filter, const std::string& key, const std::string& value) {
+    const std::string what = "--subtitle-style: " + key;
+    if (key == "size") setChecked(filter, "font_size", parseTextSize(value, what), what);
+    if (key == "color") setChecked(filter, "color", parseColour(value, what), what);
+    if (key == "font") setFont(filter, value, what);
+    if (key == "effect") setChecked(filter, "fontEffect", parseEffect(value, what), what);
+    if (key == "encoding") setChecked(filter, "encoding", parseEncoding(value, filter, what), what);
+    if (key == "delay") setChecked(filter, "delay", 1000 * parseDecimal(value, -86400, 86400, what), what);
+    if (key == "speed") setChecked(filter, "speed", parseDecimal(value, 0.001, 1000, what), what);
+    if (key == "rate") setChecked(filter, "framerate", Any(parseRate(value, what)), what);
+}
+
+// Letters that stand out from any picture; a size of 0 is their usual one.
+void setTextSize(QvCodec& filter, int size, const PictureFormat& picture, const std::string& what) {
+    AnyDict rendering("charSizePt", size);
+    rendering.set("fontEffect", kShadow);
+    if (const double aspect = picture.pixelAspect(); aspect != 1) rendering.set("pixelAspect", aspect);
+    setChecked(filter, "renderingOptions", rendering, what);
+}
+
+void setMode(QvCodec& filter, const std::string& mode, const std::string& what) {
+    if (mode != "timecode" && mode != "frames")
+        throw Failure(Exit::usage, what + ": " + inQuotes(mode) + " is neither timecode nor frames");
+    setChecked(filter, "mode", mode == "frames" ? "Frame number" : "Timecode", what);
+}
+
+// One key of --timecode.
+void setTimecode(QvCodec& filter, const std::string& key, const std::string& value,
+                 const PictureFormat& picture, bool alone) {
+    const std::string what = "--timecode: " + key;
+    const auto place = [&](int most) { return static_cast<int>(parseNumber(value, 0, most, what)); };
+    if (key == "start") setStart(filter, value, picture, alone);
+    if (key == "mode") setMode(filter, value, what);
+    if (key == "x") setChecked(filter, "positionX", place(picture.width), what);
+    if (key == "y") setChecked(filter, "positionY", place(picture.height), what);
+    if (key == "size") setTextSize(filter, parseTextSize(value, what), picture, what);
+    if (key == "color") setColour(filter, parseColour(value, what), what);
+    if (key == "font") setFont(filter, value, what);
+}
+
+}  // namespace
+
+AnyDict subtitleState(const std::string& file, const std::string& style, const PictureFormat& picture) {
+    const std::string option = "--subtitles";
+    checkFile(file, option);
+    const auto filter = makeAnyCodec("subtitle", kVideoFilter);
+    setChecked(*filter, "subtitle_filename", file.c_str(), option);
+    setChecked(*filter, "font_size", std::max(picture.height / kLinesOfText, kLeastText), option);
+    setChecked(*filter, "fontEffect", kShadow, option);
+    setChecked(*filter, "pixelAspect", picture.pixelAspect(), option);
+    const KeyValues keys(style, {"size", "color", "font", "effect", "encoding", "delay", "speed", "rate"},
+                         "--subtitle-style");
+    for (const auto& [key, value] : keys.all()) setStyle(*filter, key, value);
+    return stateOf(*filter);
+}
+
+AnyDict timecodeState(const std::string& spec, const PictureFormat& picture, bool alone, bool atTop) {
+    const std::string option = "--timecode";
+    const auto filter = makeAnyCodec("timecode", kVideoFilter);
+    setChecked(*filter, "start", "InPoint", option);
+    setTextSize(*filter, 0, picture, option);
+    if (atTop) {
+        setChecked(*filter, "positionX", picture.width * 35 / 100, option);
+        setChecked(*filter, "positionY", picture.height / kLinesOfText / 2, option);
+    }
+    const bool plain = spec == "true", isStart = !plain && spec.find('=') == std::string::npos;
+    const KeyValues keys(plain     ? ""
+                         : isStart ? "start=" + spec
+                                   : spec,
+                         {"start", "mode", "x", "y", "size", "color", "font"}, option);
+    for (const auto& [key, value] : keys.all()) setTimecode(*filter, key, value, picture, alone);
+    if (!keys.find("x") != !keys.find("y")) throw Failure(Exit::usage, option + ": x and y go together");
+    return stateOf(*filter);
+}
+
+AnyDict fadeState(const std::string& spec, const PictureFormat& picture, long long frames) {
+    const std::string option = "--fade";
+    const size_t comma = std::min(spec.find(','), spec.size());
+    const std::string in = spec.substr(0, comma), out = comma < spec.size() ? spec.substr(comma + 1) : in;
+    const auto filter = makeAnyCodec("videofade", kVideoFilter);
+    const auto framesOf = [&](const std::string& text) {
+        return static_cast<int>(parseTime(text, picture.rate, option).position(picture.rate));
+    };
+    setChecked(*filter, "fade_in", framesOf(in), option);
+    setChecked(*filter, "fade_out", framesOf(out), option);
+    setChecked(*filter, "frames_count", static_cast<int>(std::min<long long>(frames, INT32_MAX)), option);
+    return stateOf(*filter);
+}

@@ -1,0 +1,23 @@
+// What is drawn on a picture: options as the stored states of filters. Each throws Failure for what it can't
+// use, with its option in the line.
+#pragma once
+
+#include <string>
+
+#include "tarsel/picture/picture.h"
+
+// "FILE@X,Y,OPACITY" of --logo.
+AnyDict logoState(const std::string& spec, const PictureFormat& picture);
+AnyDict subtitleState(const std::string& file, const std::string& style, const PictureFormat& picture);
+// `alone`: as in PictureEffects::filters. `atTop`: out of the way of subtitles.
+AnyDict timecodeState(const std::string& spec, const PictureFormat& picture, bool alone, bool atTop);
+AnyDict fadeState(const std::string& spec, const PictureFormat& picture, long long frames);
+
+// Whether the logo of --logo is a file with moving pictures.
+bool logoIsMoving(const std::string& spec);
+
+// The rectangle that --crop keeps of a picture.
+QvRect parseCrop(const std::string& text, const PictureFormat& picture);
+
+// The state of a codec, switched on.
+AnyDict stateOf(const QvCodec& codec);

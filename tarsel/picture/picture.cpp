@@ -1,0 +1,410 @@
+#include "tarsel/picture/picture.h"
+
+#include <algorithm>
+#include <charconv>
+#include <cstring>
+#include <filesystem>
+
+#include "tarsel/picture/overlays.h"
+#include "tarsel/words/failure.h"
+#include "tarsel/words/keyvalues.h"
+#include "tarsel/words/timespec.h"
+
+namespace fs = std::filesystem;
+
+namespace {
+
+constexpr int kVideo = 1, kAudio = 2;
+constexpr int kVideoFilter = 12, kAudioFilter = 13, kVideoEncoder = 7;
+
+bool isYuv(unsigned fourcc) {
+    const QvPixelFormat* format = qvPixelFormat(fourcc);
+    return format && !format->rgb && fourcc != QvFourcc::b64a && fourcc != QvFourcc::R32C &&
+           fourcc != QvFourcc::R555 && fourcc != QvFourcc::R565;
+}
+
+// The format in which the encoder of an output wants its frames; BGR3 if it can't write that output.
+unsigned frameFormat(unsigned fourcc) {
+    const auto encoder = makeAnyCodec("rawvenc", kVideoEncoder);
+    try {
+        if (encoder->setParam("type", static_cast<int>(fourcc)) == QvStatus::ok)
+            return static_cast<unsigned>(
+                encoder->getParam("selectedFOURCC").asInt32(static_cast<int>(fourcc)));
+    } catch (const QvException&) {
+    }
+    return QvFourcc::BGR3;
+}
+
+// A value of --filter as the type that it looks like.
+Any valueOf(const std::string& text) {
+    char* end = nullptr;
+    const long long whole = std::strtoll(text.c_str(), &end, 10);
+    if (!text.empty() && *end == '\0' && whole >= INT32_MIN && whole <= INT32_MAX)
+        return Any(static_cast<int>(whole));
+    double number = 0;
+    const auto [rest, error] = std::from_chars(text.data(), text.data() + text.size(), number);
+    if (error == std::errc() && rest == text.data() + text.size()) return Any(number);
+    return Any(text.c_str());
+}
+
+// Text of digits may be meant as text.
+void setGuessed(QvCodec& filter, const std::string& key, const std::string& text, const std::string& option) {
+    const Any value = valueOf(text);
+    if (!value.isText() && filter.getParam(key.c_str()).isText()) {
+        try {
+            return setChecked(filter, key, Any(text.c_str()), option);
+        } catch (const Failure&) {
+        }
+    }
+    setChecked(filter, key, value, option);
+}
+
+AnyDict scalerState(int width, int height, unsigned fourcc) {
+    const auto scaler = makeAnyCodec("scaler", kVideoFilter);
+    setChecked(*scaler, "outWidth", width, "--size");
+    setChecked(*scaler, "outHeight", height, "--size");
+    setChecked(*scaler, "FOURCC", static_cast<int>(fourcc), "--pixel");
+    return stateOf(*scaler);
+}
+
+std::string filterName(const std::string& spec) { return spec.substr(0, spec.find(':')); }
+
+// Custom filters stand in the order of their positions.
+void append(FiltersState& state, AnyDict filter, bool front) {
+    filter.set("_front", front ? 1 : 0);
+    filter.set("_position", state.count() + 1);
+    state.appendFilter(filter.getString("name", ""), filter);
+}
+
+int intParam(const QvDecodePipe& decoder, int stream, const char* name) {
+    return decoder.getStreamParam(kVideo, stream, name).asInt32(0);
+}
+
+int matrixNumber(std::string_view text, const std::string& all) {
+    if (text == "601") return 1;
+    if (text == "709") return 2;
+    throw Failure(Exit::usage, "--matrix: " + inQuotes(all) + " is not 601, 709, or IN:OUT of these");
+}
+
+}  // namespace
+
+int filterType(const std::string& spec) {
+    const std::string name = filterName(spec);
+    const QvModule* module = qv_registry()->module(name.c_str());
+    const int kind = module ? module->getAttr("type").toInt32() : 0;
+    if (kind == kVideoFilter) return kVideo;
+    if (kind == kAudioFilter) return kAudio;
+    std::vector<std::string> known = moduleNames(kVideoFilter);
+    for (const auto& audio : moduleNames(kAudioFilter)) known.push_back(audio);
+    throw Failure(Exit::module, "--filter: there is no filter " + inQuotes(name) + "." +
+                                    suggestion(name, known) + " 'tarsel modules' lists all");
+}
+
+AnyDict filterState(const std::string& spec) {
+    const std::string name = filterName(spec), option = "--filter " + name;
+    const auto filter = makeAnyCodec(name, filterType(spec) == kVideo ? kVideoFilter : kAudioFilter);
+    const KeyValues keys(name.size() == spec.size() ? "" : spec.substr(name.size() + 1), {}, option);
+    for (const auto& [key, value] : keys.all()) setGuessed(*filter, key, value, option);
+    // Two frames of each interlaced one are made first, so that scaling and a further change of the rate work
+    // on whole pictures.
+    if (filter->getParam("_rateFactor").asInt32(1) > 1 && !keys.find("_front")) filter->setParam("_front", 1);
+    return stateOf(*filter);
+}
+
+double PictureFormat::pixelAspect() const {
+    const double ratio = aspect * height / std::max(width, 1);
+    return ratio < 0.1 || ratio > 10 || std::abs(ratio - 1) < 0.01 ? 1 : ratio;
+}
+
+// --- The plan of a picture.
+
+PictureEffects::PictureEffects(const EffectOptions& options, const Source& source, int stream, bool toPng)
+    : options_(options) {
+    const QvDecodePipe& decoder = source.decoder();
+    in_.width = intParam(decoder, stream, "width");
+    in_.height = intParam(decoder, stream, "height");
+    in_.fourcc = static_cast<unsigned>(intParam(decoder, stream, "FOURCC"));
+    const Any rate = decoder.getStreamParam(kVideo, stream, "framerate");
+    if (rate.isFramerate()) in_.rate = rate.asFramerate();
+    const Any aspect = decoder.getStreamParam(kVideo, stream, "frameAspect");
+    in_.aspect = aspect.isDouble() && aspect.asDouble() > 0
+                     ? aspect.asDouble()
+                     : static_cast<double>(in_.width) / std::max(in_.height, 1);
+    out_ = in_;
+    planDeinterlace();
+    planCrop();
+    if (!options_.size.empty()) {
+        const Size size = parseSize(options_.size, "--size");
+        out_.width = size.width;
+        out_.height = size.height;
+    }
+    planRate();
+    if (!options_.pixel.empty()) out_.fourcc = parsePixel(options_.pixel, "--pixel");
+    planMatrix(toPng);
+    if (options_.subtitles.empty() && !options_.subtitleStyle.empty())
+        throw Failure(Exit::usage,
+                      "--subtitle-style: there are no subtitles; give them with --subtitles FILE");
+}
+
+void PictureEffects::planDeinterlace() {
+    const int order = in_.rate.interlaced();
+    if (options_.flip && order && in_.height % 2 == 0) out_.rate.setInterlaced(3 - order);
+    if (options_.deinterlace.empty()) return;
+    deinterlace_ = options_.deinterlace == "true" ? "top" : options_.deinterlace;
+    const std::vector<std::string> known = {"top", "bottom", "bob", "double", "reverse"};
+    if (std::find(known.begin(), known.end(), deinterlace_) == known.end())
+        throw Failure(Exit::usage, "--deinterlace: there is no method " + inQuotes(deinterlace_) + "." +
+                                       suggestion(deinterlace_, known) +
+                                       " Use top, bottom, bob, double or reverse");
+    if (order == 0)
+        throw Failure(
+            Exit::usage,
+            "--deinterlace: the input is progressive; a raw file of fields has rate=25i or 25b in --raw");
+    if (deinterlace_ == "reverse") {
+        out_.rate.setInterlaced(3 - out_.rate.interlaced());
+        return;
+    }
+    out_.rate.setInterlaced(0);
+    if (deinterlace_ == "double")
+        out_.rate = QvFramerate(QvRatio(in_.rate.rate().num * 2, in_.rate.rate().den));
+}
+
+void PictureEffects::planRate() {
+    if (options_.rate.empty()) return;
+    const double before = static_cast<double>(out_.rate.rate());
+    out_.rate = parseRate(options_.rate, "--rate");
+    const double after = static_cast<double>(out_.rate.rate());
+    const auto converts = [](double fps) { return fps > 0.1 && fps <= 120; };
+    if (before == after || (converts(before) && converts(after))) return;
+    char text[120];
+    std::snprintf(text, sizeof text,
+                  "--rate: %g to %g frames a second can't be converted: each may be above 0.1, up to 120",
+                  before, after);
+    throw Failure(Exit::usage, text);
+}
+
+void PictureEffects::planCrop() {
+    if (options_.crop.empty()) return;
+    crop_ = parseCrop(options_.crop, in_);
+    out_.width = crop_->width();
+    out_.height = crop_->height();
+    out_.aspect *= static_cast<double>(crop_->width()) / in_.width * in_.height / crop_->height();
+}
+
+// One matrix is that of the side that is YUV, and of the output if both are.
+void PictureEffects::planMatrix(bool toPng) {
+    const std::string& text = options_.matrix;
+    if (text.empty()) return;
+    if (toPng && options_.pixel.empty()) out_.fourcc = QvFourcc::BGR3;
+    const bool yuvIn = isYuv(in_.fourcc), yuvOut = isYuv(out_.fourcc);
+    if (!yuvIn && !yuvOut) throw Failure(Exit::usage, "--matrix: neither the input nor the output is YUV");
+    if (const size_t colon = text.find(':'); colon != std::string::npos) {
+        inMatrix_ = matrixNumber(std::string_view(text).substr(0, colon), text);
+        outMatrix_ = matrixNumber(std::string_view(text).substr(colon + 1), text);
+    } else {
+        (yuvOut ? outMatrix_ : inMatrix_) = matrixNumber(text, text);
+    }
+}
+
+bool PictureEffects::needsAllFrames() const {
+    return !options_.fade.empty() || !options_.filters.empty() || deinterlace_ == "double" ||
+           !options_.rate.empty() || std::any_of(options_.logos.begin(), options_.logos.end(), logoIsMoving);
+}
+
+void PictureEffects::addFixed(FiltersState& state) const {
+    if (options_.flip) {
+        const auto flipper = makeAnyCodec("flipper", kVideoFilter);
+        setChecked(*flipper, "flip", 1, "--flip");
+        state.setFilter("flipper", stateOf(*flipper));
+    }
+    if (!deinterlace_.empty() && deinterlace_ != "double") {
+        const auto filter = makeAnyCodec("deinterlace", kVideoFilter);
+        setChecked(*filter, "deinterlace", deinterlace_.c_str(), "--deinterlace");
+        state.setFilter("deinterlace", stateOf(*filter));
+    }
+    if (inMatrix_ || outMatrix_) {
+        AnyDict scaler("_on", 1);
+        if (inMatrix_) scaler.set("inITU", inMatrix_);
+        if (outMatrix_) scaler.set("outITU", outMatrix_);
+        state.set("scaler", scaler);
+    }
+    if (!crop_) return;
+    const auto cropper = makeAnyCodec("cropper", kVideoFilter);
+    const auto set = [&](const char* name, const Any& value) { setChecked(*cropper, name, value, "--crop"); };
+    set("inputWidth", in_.width);
+    set("inputHeight", in_.height);
+    set("mode", 1);
+    set("cropBox", *crop_);
+    if (cropper->getParam("outputWidth") != crop_->width() ||
+        cropper->getParam("outputHeight") != crop_->height())
+        throw Failure(Exit::usage, "--crop: " + inQuotes(options_.crop) + " can't be cut from this picture");
+    state.setFilter("cropper", stateOf(*cropper));
+}
+
+void PictureEffects::addOptions(FiltersState& state, long long frames, bool alone) const {
+    for (const auto& spec : options_.filters) {
+        if (filterType(spec) != kVideo) continue;
+        const AnyDict filter = filterState(spec);
+        const std::string name = filter.getString("name", "");
+        if ((name == "flipper" || name == "cropper" || name == "deinterlace") && state.isSet(name.c_str()))
+            throw Failure(Exit::usage,
+                          "--filter " + name + ": it has one place in the chain, which is taken");
+        append(state, filter, filter.get("_front").isTrue());
+    }
+    for (const auto& logo : options_.logos) append(state, logoState(logo, out_), false);
+    // Text has to be drawn on other frames than those of I422.
+    const bool text = !options_.subtitles.empty() || !options_.timecode.empty();
+    const bool apart = text && frameFormat(out_.fourcc) == QvFourcc::I422;
+    if (apart) append(state, scalerState(out_.width, out_.height, QvFourcc::YUYV), false);
+    if (!options_.subtitles.empty())
+        append(state, subtitleState(options_.subtitles, options_.subtitleStyle, out_), false);
+    if (!options_.fade.empty()) append(state, fadeState(options_.fade, out_, frames), false);
+    if (!options_.timecode.empty())
+        append(state, timecodeState(options_.timecode, out_, alone, !options_.subtitles.empty()), false);
+    if (apart) append(state, scalerState(out_.width, out_.height, QvFourcc::I422), false);
+}
+
+FiltersState PictureEffects::filters(long long frames, bool alone) const {
+    FiltersState state;
+    if (deinterlace_ == "double") append(state, stateOf(*makeAnyCodec("bobber", kVideoFilter)), true);
+    // The cropper has no hold on pixels that are packed by sixes.
+    if (crop_ && in_.fourcc == QvFourcc::v210)
+        append(state, scalerState(in_.width, in_.height, QvFourcc::Y216), true);
+    addFixed(state);
+    addOptions(state, frames, alone);
+    return state;
+}
+
+VideoJobDescription PictureEffects::job(const FiltersState& filters) const {
+    VideoJobDescription job;
+    job.inWidth = in_.width;
+    job.inHeight = in_.height;
+    job.inFOURCC = in_.fourcc;
+    job.inFramerate = in_.rate;
+    job.inFrameAspect = in_.aspect;
+    job.outWidth = out_.width;
+    job.outHeight = out_.height;
+    job.outFOURCC = frameFormat(out_.fourcc);
+    job.outFramerate = out_.rate;
+    job.filters = filters;
+    return job;
+}
+
+// --- Pipes.
+
+namespace {
+
+// Opens a filter for a moment. One that writes a file would make it then, so it has to wait for the run.
+void tryFilter(QvVideoFilter& filter) {
+    if (!filterFile(filter, QV_GUI_FILESELECT_SAVE).empty()) return;
+    int result = QvStatus::failed;
+    std::string reason;
+    try {
+        result = filter.open();
+        reason = filter.errorDesc();
+        filter.close();
+    } catch (const QvException& failure) {
+        reason = failure.what();
+    }
+    if (result == QvStatus::ok) return;
+    const std::string_view name = filter.name();
+    const bool reads = !filterFile(filter, QV_GUI_FILESELECT_LOAD).empty();
+    throw Failure(reads ? Exit::input : Exit::usage,
+                  "the filter " + std::string(name) + " can't be used: " + inLine(reason));
+}
+
+std::string textOf(const Any& value) {
+    if (value.isText()) {
+        const Any text = value.toString();
+        return inQuotes(text.asString(""));
+    }
+    char text[64];
+    switch (value.type()) {
+        case Any::Int32:
+        case Any::Int64: return std::to_string(value.toInt64());
+        case Any::Float: std::snprintf(text, sizeof text, "%g", value.asFloat()); return text;
+        case Any::Point:
+            return std::to_string(value.asPoint().x()) + "," + std::to_string(value.asPoint().y());
+        case Any::Rect:
+            return std::to_string(value.asRect().width()) + "x" + std::to_string(value.asRect().height()) +
+                   "+" + std::to_string(value.asRect().left()) + "+" + std::to_string(value.asRect().top());
+        case Any::Framerate: return value.asFramerate().desc(true, true).asString();
+        default: return "";
+    }
+}
+
+// What differs from the values that a filter begins with.
+void addSettings(const AnyDict& state, const AnyDict& initial, std::string& line) {
+    for (int i = 0; i < state.size(); ++i) {
+        const std::string key = state.getKey(i);
+        const Any& value = state.get(key.c_str());
+        const Any& before = initial.get(key.c_str());
+        if (key[0] == '_' || key == "name" || value == before) continue;
+        if (value.isDict())
+            addSettings(value.asDict(), before.isDict() ? before.asDict() : AnyDict(), line);
+        else if (const std::string text = textOf(value); !text.empty())
+            line.append(" ").append(key).append("=").append(text);
+    }
+}
+
+}  // namespace
+
+std::string filterFile(const QvCodec& filter, int guiControl) {
+    const Any set = filter.getParam("paramSet");
+    for (int i = 0; set.isVector() && i < set.asVector().size(); ++i) {
+        const AnyDict& described = set.asVector().at(i).asDict();
+        if (described.getInt32("guiControl", 0) != guiControl) continue;
+        const Any value = filter.getParam(described.getString("name", "")).toString();
+        if (*value.asString("")) return value.asString("");
+    }
+    return "";
+}
+
+void checkFilterFiles(const QvVProcessPipe& pipe, const std::vector<std::string>& inputs,
+                      const Outputs* outputs, bool overwrite) {
+    const auto checkOutput = [&](const std::string& name, const char* what) {
+        std::error_code error;
+        if (outputs && !outputs->isDevice() &&
+            fs::weakly_canonical(name, error) == fs::weakly_canonical(outputs->output(), error))
+            throw Failure(Exit::output, "can't write " + inQuotes(name) + ": it is also " + what);
+    };
+    std::vector<std::string> read = inputs;
+    for (int i = 0; i < pipe.nrFilters(); ++i)
+        if (const auto name = filterFile(*pipe.filter(i), QV_GUI_FILESELECT_LOAD); !name.empty()) {
+            checkOutput(name, "an input");
+            read.push_back(name);
+        }
+    for (int i = 0; i < pipe.nrFilters(); ++i) {
+        const QvCodec& filter = *pipe.filter(i);
+        const std::string name = filterFile(filter, QV_GUI_FILESELECT_SAVE);
+        if (name.empty()) continue;
+        const Outputs checked(name, std::string("--filter ") + filter.name(), read, overwrite);
+        checkOutput(name, "the output of the job");
+    }
+}
+
+std::unique_ptr<QvVProcessPipe> tryPipe(const VideoJobDescription& job) {
+    std::unique_ptr<QvVProcessPipe> pipe;
+    try {
+        pipe.reset(QvProcessUtil::createVideoPipeAux(job, nullptr, true));
+    } catch (const QvAssertFailure& failure) {
+        throw Failure(Exit::module, inLine(failure.what()));
+    }
+    for (int i = 0; pipe && i < pipe->nrFilters(); ++i) tryFilter(*pipe->filter(i));
+    return pipe;
+}
+
+std::vector<std::string> describe(const QvVProcessPipe* pipe) {
+    std::vector<std::string> lines;
+    for (int i = 0; pipe && i < pipe->nrFilters(); ++i) {
+        const QvVideoFilter& filter = *pipe->filter(i);
+        std::string line = filter.name();
+        const std::unique_ptr<QvCodec> fresh(qv_registry()->newCodec(filter.name()));
+        AnyDict state, initial;
+        filter.store(state);
+        if (fresh) fresh->store(initial);
+        addSettings(state, initial, line);
+        lines.push_back(line);
+    }
+    return lines;
+}

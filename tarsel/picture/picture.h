@@ -1,0 +1,73 @@
+// The way of a picture from a stream to an output: its format at both ends and the filters between them.
+#pragma once
+
+#include <optional>
+#include <string>
+#include <vector>
+
+#include <qvplugcore/qvplugcore.h>
+
+#include "tarsel/host/outputs.h"
+#include "tarsel/picture/effects.h"
+#include "tarsel/source/source.h"
+
+struct PictureFormat {
+    int width = 0, height = 0;
+    unsigned fourcc = 0;
+    QvFramerate rate{QvRatio(25, 1)};
+    double aspect = 0;  // of the picture when it is shown
+    // Width to height of a pixel; 1 for anything near to it or beyond use.
+    double pixelAspect() const;
+};
+
+class PictureEffects {
+  public:
+    // `toPng`: the output is shown as RGB. Throws Failure for options that don't fit the stream.
+    PictureEffects(const EffectOptions& options, const Source& source, int stream, bool toPng);
+
+    const PictureFormat& in() const { return in_; }
+    const PictureFormat& out() const { return out_; }
+
+    // The filters of a run that writes `frames` frames. `alone`: frames are asked for singly, so that none
+    // is the first. Throws Failure for what can't be used.
+    FiltersState filters(long long frames, bool alone) const;
+    // The run itself.
+    VideoJobDescription job(const FiltersState& filters) const;
+    // Whether a frame depends on those before it.
+    bool needsAllFrames() const;
+
+  private:
+    void planDeinterlace();
+    void planRate();
+    void planCrop();
+    void planMatrix(bool toPng);
+    void planTimecode();
+    void addFixed(FiltersState& state) const;
+    void addOptions(FiltersState& state, long long frames, bool alone) const;
+
+    const EffectOptions& options_;
+    PictureFormat in_, out_;
+    std::string deinterlace_;  // method, empty for none
+    std::optional<QvRect> crop_;
+    int inMatrix_ = 0, outMatrix_ = 0;
+};
+
+// The type (1 video, 2 audio) of the streams that a filter of --filter works on. Throws Failure.
+int filterType(const std::string& spec);
+// The stored state of the filter that --filter describes, switched on.
+AnyDict filterState(const std::string& spec);
+
+// The first file that a filter has been given to read (QV_GUI_FILESELECT_LOAD) or to write (..._SAVE), as its
+// descriptions of parameters say; empty without one.
+std::string filterFile(const QvCodec& filter, int guiControl);
+
+// That what filters read is not overwritten by `outputs` (null: there is none), and what they write is
+// neither an input nor an output and, unless `overwrite`, does not exist. Throws Failure.
+void checkFilterFiles(const QvVProcessPipe& pipe, const std::vector<std::string>& inputs,
+                      const Outputs* outputs, bool overwrite);
+
+// The pipe of a job, null if it has nothing to do. Each filter has been tried, so that what fails later fails
+// by chance. Throws Failure.
+std::unique_ptr<QvVProcessPipe> tryPipe(const VideoJobDescription& job);
+// A line for each filter of a pipe: its name and what it was told.
+std::vector<std::string> describe(const QvVProcessPipe* pipe);

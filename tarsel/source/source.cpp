@@ -1,0 +1,307 @@
+#include "tarsel/source/source.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <cstdio>
+#include <cstring>
+#include <filesystem>
+
+#include "tarsel/words/failure.h"
+#include "tarsel/words/keyvalues.h"
+#include "tarsel/words/timespec.h"
+
+namespace {
+
+constexpr int kDecoder = 2;
+constexpr int kSubpicture = 4;
+constexpr const char* kGenerator = "testgen:";
+
+// Every name that a raw format takes.
+const std::vector<std::string> kRawKeys = {"size",       "pixel",  "rate",   "offset",
+                                           "interlaced", "invert", "aspect", "fields"};
+const std::vector<std::string> kGeneratorKeys = {"size", "rate",  "duration", "views",
+                                                 "mode", "audio", "aspect",   "picture"};
+
+double parseAspect(const std::string& text, const std::string& option) {
+    const size_t colon = text.find(':');
+    if (colon == std::string::npos) return static_cast<double>(parseNumber(text, 1, 100, option));
+    return static_cast<double>(parseNumber(text.substr(0, colon), 1, 10000, option)) /
+           static_cast<double>(parseNumber(text.substr(colon + 1), 1, 10000, option));
+}
+
+}  // namespace
+
+void printWarnings() {
+    AnyVector messages;
+    qv_log()->getAll(messages);
+    for (const Any& message : messages)
+        if (message.asDict().getInt32("type") == QvLogMask::warning)
+            std::fprintf(stderr, "tarsel: warning: %s\n", message.asDict().getString("text", ""));
+}
+
+std::vector<std::string> moduleNames(int kind) {
+    std::vector<std::string> names;
+    const AnyVector modules = qv_registry()->modules(kind);
+    names.reserve(static_cast<size_t>(modules.size()));
+    for (int i = 0; i < modules.size(); ++i) names.push_back(modules.at(i).asDict().getString("name", ""));
+    return names;
+}
+
+std::unique_ptr<QvCodec> makeAnyCodec(const std::string& module, int kind) {
+    const QvModule* found = qv_registry()->module(module.c_str());
+    if (!found || found->getAttr("type").toInt32() != kind)
+        throw Failure(Exit::module, "there is no module " + inQuotes(module) + " of this kind." +
+                                        suggestion(module, moduleNames(kind)) +
+                                        " 'tarsel modules' lists all");
+    std::unique_ptr<QvCodec> codec(qv_registry()->newCodec(module.c_str()));
+    if (!codec)
+        throw Failure(Exit::module, "the module " + inQuotes(module) + " can't be used in this installation");
+    return codec;
+}
+
+namespace {
+
+std::vector<std::string> storedNames(const QvCodec& codec) {
+    AnyDict state;
+    codec.store(state);
+    std::vector<std::string> names;
+    for (int i = 0; i < state.size(); ++i)
+        if (const std::string name = state.getKey(i); name[0] != '_') names.push_back(name);
+    return names;
+}
+
+}  // namespace
+
+void setChecked(QvCodec& codec, const std::string& name, const Any& value, const std::string& what) {
+    int result = QvStatus::invalidParam;
+    try {
+        result = codec.setParam(name.c_str(), value);
+    } catch (const QvParamException&) {
+        throw Failure(Exit::usage, what + ": " + codec.name() + " has no parameter " + inQuotes(name) + "." +
+                                       suggestion(name, storedNames(codec)));
+    }
+    if (result == QvStatus::ok) return;
+    const std::string reason = codec.errorDesc();
+    throw Failure(Exit::usage, what + ": " + codec.name() + " can't take this value for " + inQuotes(name) +
+                                   (reason.empty() ? "" : " (" + inLine(reason) + ")"));
+}
+
+namespace {
+
+bool isGenerator(const std::string& spec) { return spec.rfind(kGenerator, 0) == 0 || spec == "testgen"; }
+
+}  // namespace
+
+Source::Source(const std::string& spec, const std::string& raw) : name_(spec) {
+    if (isGenerator(spec)) {
+        isFile_ = false;
+        if (!raw.empty())
+            throw Failure(Exit::usage, "--raw describes a file; " + inQuotes(spec) + " is none");
+        openGenerator(spec);
+        return;
+    }
+    std::error_code error;
+    const auto status = std::filesystem::status(spec, error);
+    if (!std::filesystem::exists(status))
+        refuse(error && error != std::errc::no_such_file_or_directory ? inLine(error.message())
+                                                                      : "no such file");
+    if (std::filesystem::is_directory(status)) refuse("this is a folder");
+    if (std::filesystem::is_regular_file(status)) {
+        if (std::filesystem::file_size(spec, error) == 0 && !error) refuse("the file is empty");
+        if (FILE* file = std::fopen(spec.c_str(), "rb"))
+            std::fclose(file);
+        else
+            refuse(std::strerror(errno));
+    } else {
+        refuse("this is no regular file");
+    }
+    if (raw.empty())
+        openFile();
+    else
+        openRaw(raw);
+}
+
+bool Source::describesItself(const std::string& spec) {
+    if (isGenerator(spec)) return true;
+    const Any ext = QvFile::getExt(Any(spec.c_str()), true);
+    return !qv_registry()->decoders(ext.asString()).empty();
+}
+
+void Source::refuse(const std::string& why) const {
+    throw Failure(Exit::input, "can't open " + inQuotes(name_) + ": " + inLine(why));
+}
+
+void Source::openGenerator(const std::string& spec) {
+    const std::string option = "testgen";
+    const size_t colon = spec.find(':');
+    const KeyValues keys(colon == std::string::npos ? "" : std::string_view(spec).substr(colon + 1),
+                         kGeneratorKeys, option);
+    const auto value = [&](const char* key, const char* otherwise) {
+        const std::string* given = keys.find(key);
+        return given ? *given : std::string(otherwise);
+    };
+    const Size size = parseSize(value("size", "1280x720"), option + ": size");
+    if (size.width < 32 || size.height < 32)
+        throw Failure(Exit::usage, option + ": size: the test picture is at least 32x32");
+    const QvFramerate rate = parseRate(value("rate", "25"), option + ": rate");
+    const MediaTime duration = parseTime(value("duration", "10"), rate, option + ": duration");
+    if (duration.position(rate) < 1)
+        throw Failure(Exit::usage, option + ": duration: " + value("duration", "10") + " holds no frame");
+
+    AnyDict video, audio, streams;
+    video.set("width", size.width);
+    video.set("height", size.height);
+    video.set("framerate", Any(rate));
+    video.set("duration", Any(duration));
+    if (const std::string* views = keys.find("views"))
+        video.set("nrViews", static_cast<int>(parseNumber(*views, 1, 10, option + ": views")));
+    if (const std::string* aspect = keys.find("aspect"))
+        video.set("frameAspect", parseAspect(*aspect, option + ": aspect"));
+    if (const std::string* picture = keys.find("picture")) {
+        if (!std::filesystem::is_regular_file(*picture))
+            throw Failure(Exit::input, "can't open the picture " + inQuotes(*picture));
+        video.set("picture", picture->c_str());
+    }
+    audio.set("duration", Any(duration));
+    AnyVector vids, auds;
+    vids.append(video);
+    if (parseNumber(value("audio", "1"), 0, 1, option + ": audio")) auds.append(audio);
+    streams.set("vids", vids);
+    streams.set("auds", auds);
+
+    decoder_ = makeCodec<QvDecodePipe>("testgen", kDecoder);
+    if (const std::string* mode = keys.find("mode")) {
+        if (*mode != "graybar" && *mode != "card")
+            throw Failure(Exit::usage, option + ": mode: use card or graybar");
+        decoder_->setParam("mode", mode->c_str());
+    }
+    decoder_->setParam("streams", streams);
+    if (decoder_->open() != QvStatus::ok) refuse(decoder_->errorDesc());
+    if (decoder_->nrStreams(1) == 0) refuse("the picture can't be used");
+}
+
+void Source::openRaw(const std::string& raw) {
+    const std::string option = "--raw";
+    const KeyValues keys(raw, kRawKeys, option);
+    const std::string *size = keys.find("size"), *pixel = keys.find("pixel"), *rate = keys.find("rate");
+    if (!size || !pixel) throw Failure(Exit::usage, "--raw needs size=WIDTHxHEIGHT and pixel=FORMAT");
+    decoder_ = makeCodec<QvDecodePipe>("rawdec", kDecoder);
+    QvDecodePipe& d = *decoder_;
+    const Size dimensions = parseSize(*size, option + " size");
+    setChecked(d, "filename", name_.c_str(), option);
+    setChecked(d, "FOURCC", static_cast<int>(parsePixel(*pixel, option + " pixel")), option + " pixel");
+    setChecked(d, "width", dimensions.width, option + " size");
+    setChecked(d, "height", dimensions.height, option + " size");
+    setChecked(d, "framerate", Any(parseRate(rate ? *rate : "25", option + " rate")), option + " rate");
+    if (const auto* offset = keys.find("offset"))
+        setChecked(d, "offset", parseNumber(*offset, 0, 1LL << 62, option + " offset"), option + " offset");
+    if (const auto* order = keys.find("interlaced"))
+        setChecked(d, "interlacedFlag", static_cast<int>(parseNumber(*order, 0, 2, option + " interlaced")),
+                   option + " interlaced");
+    if (const auto* invert = keys.find("invert"))
+        setChecked(d, "invert", static_cast<int>(parseNumber(*invert, 0, 1, option + " invert")),
+                   option + " invert");
+    if (const auto* fields = keys.find("fields"))
+        setChecked(d, "fieldOrderFile", static_cast<int>(parseNumber(*fields, 0, 1, option + " fields")),
+                   option + " fields");
+    if (const auto* aspect = keys.find("aspect"))
+        setChecked(d, "frameAspect", parseAspect(*aspect, option + " aspect"), option + " aspect");
+    if (d.open() != QvStatus::ok) refuse(d.errorDesc());
+    if (d.nrFrames(0) == 0) refuse("the file is shorter than one frame of " + *size + " " + *pixel);
+}
+
+namespace {
+
+bool isCaptionFile(const std::string& name) {
+    const Any ext = QvFile::getExt(Any(name.c_str()), true);
+    return ext == "scc" || ext == "sc2";
+}
+
+// Half of all caption files are written in drop frame.
+Any captionParameters() { return AnyDict("dropFrameLines", 1); }
+
+}  // namespace
+
+// Why the best decoder refuses the file. The factory keeps only its name, so it is asked once more.
+std::string Source::reasonOf(const AnyVector& decoders) const {
+    std::unique_ptr<QvCodec> codec(qv_registry()->newCodec(decoders.at(0).asString()));
+    if (!codec) return std::string("the decoder ") + decoders.at(0).asString() + " can't be used";
+    if (isCaptionFile(name_)) codec->setParam("openParameters", captionParameters());
+    codec->setParam("filename", name_.c_str());
+    if (codec->open() == QvStatus::ok || !*codec->errorDesc()) return "no decoder can read it";
+    return codec->errorDesc();
+}
+
+void Source::openFile() {
+    const Any ext = QvFile::getExt(Any(name_.c_str()), true);
+    const Any params = captionParameters();
+    decoder_.reset(QvDecFactory::decodePipe(Any(name_.c_str()), Any(), nullptr,
+                                            isCaptionFile(name_) ? &params : nullptr));
+    if (decoder_) return;
+    const AnyVector candidates = qv_registry()->decoders(ext.asString());
+    const std::unique_ptr<AnyVector> exts(qv_registry()->inputExts(false, false));
+    if (candidates.empty()) {
+        std::vector<std::string> known;
+        for (int i = 0; i < exts->size(); ++i) known.push_back(exts->at(i).asString());
+        if (std::find(known.begin(), known.end(), ext.asString()) != known.end())
+            refuse("a raw file has no header; give its format with --raw size=WxH,pixel=FORMAT,rate=R");
+        refuse("no decoder for the extension " + inQuotes(ext.asString()) +
+               "; 'tarsel formats' lists what opens");
+    }
+    refuse(reasonOf(candidates));
+}
+
+long long Source::bytes() const {
+    std::error_code error;
+    const auto size = isFile_ ? std::filesystem::file_size(name_, error) : 0;
+    return isFile_ && !error ? static_cast<long long>(size) : -1;
+}
+
+std::optional<QvFramerate> Source::frameRate() const {
+    if (decoder_->nrStreams(1) == 0) return std::nullopt;
+    const Any rate = decoder_->getVideoParam(0, "framerate");
+    if (!rate.isFramerate()) return std::nullopt;
+    return rate.asFramerate();
+}
+
+double Source::duration() const {
+    double longest = -1;
+    for (int type : {1, 2})
+        for (int i = 0; i < decoder_->nrStreams(type); ++i) {
+            const Any seconds = decoder_->getStreamParam(type, i, "duration");
+            if (seconds.isDouble()) longest = std::max(longest, seconds.asDouble());
+        }
+    if (decoder_->nrStreams(1) + decoder_->nrStreams(2) > 0) return longest;
+    for (int i = 0; i < decoder_->nrStreams(kSubpicture); ++i)
+        longest = std::max(longest, decoder_->duration(kSubpicture, i).seconds());
+    return longest;
+}
+
+void Source::selectAll() {
+    for (int type : {1, 2})
+        for (int i = 0; i < decoder_->nrStreams(type); ++i)
+            if (decoder_->select(type, i) != QvStatus::ok)
+                refuse(std::string(type == 1 ? "video" : "audio") + " stream " + std::to_string(i) +
+                       " can't be read");
+}
+
+std::string Source::damage() const {
+    for (int i = 0; i < decoder_->nrStreams(kSubpicture); ++i)
+        if (const long long bytes = decoder_->getStreamParam(kSubpicture, i, "unread").asInt64(0); bytes > 0)
+            return "the last " + std::to_string(bytes) + " bytes of its text can't be read";
+    for (int type : {1, 2})
+        for (int i = 0; i < decoder_->nrStreams(type); ++i) {
+            AnyDict params;
+            decoder_->getStreamParams(type, i, params);
+            if (!params.get("truncated").isTrue()) continue;
+            const bool video = type == 1;
+            const long long present = video ? decoder_->nrFrames(i) : decoder_->nrSamples(i);
+            const long long expected = params.getInt64(video ? "framesExpected" : "samplesExpected", present);
+            if (video && !params.isSet("samplesExpected") && expected == present + 1)
+                return "it ends in the middle of frame " + std::to_string(expected) + ", after " +
+                       std::to_string(present) + " whole ones";
+            return "it ends after " + std::to_string(present) + " of " + std::to_string(expected) +
+                   (video ? " frames" : " samples");
+        }
+    return "";
+}

@@ -1,0 +1,44 @@
+#include "tarsel/words/keyvalues.h"
+
+#include <algorithm>
+
+#include "tarsel/words/failure.h"
+
+namespace {
+
+// The text up to a comma, which goes as well. A backslash takes the meaning from what follows it.
+std::string takePart(std::string_view& text) {
+    std::string part;
+    while (!text.empty()) {
+        const char c = text[0];
+        const bool escaped = c == '\\' && text.size() > 1 && (text[1] == ',' || text[1] == '\\');
+        text.remove_prefix(1);
+        if (c == ',') break;
+        part += escaped ? text[0] : c;
+        if (escaped) text.remove_prefix(1);
+    }
+    return part;
+}
+
+}  // namespace
+
+KeyValues::KeyValues(std::string_view text, const std::vector<std::string>& known, std::string_view option) {
+    while (!text.empty()) {
+        const std::string pair = takePart(text);
+        const size_t equals = pair.find('=');
+        if (equals == std::string::npos || equals == 0)
+            throw Failure(Exit::usage,
+                          std::string(option) + ": " + inQuotes(pair) + " is not of the form key=value");
+        const std::string key = pair.substr(0, equals);
+        if (!known.empty() && std::find(known.begin(), known.end(), key) == known.end())
+            throw Failure(Exit::usage, std::string(option) + ": unknown key " + inQuotes(key) + "." +
+                                           suggestion(key, known));
+        pairs_.emplace_back(key, pair.substr(equals + 1));
+    }
+}
+
+const std::string* KeyValues::find(std::string_view key) const {
+    for (auto pair = pairs_.rbegin(); pair != pairs_.rend(); ++pair)
+        if (pair->first == key) return &pair->second;
+    return nullptr;
+}

@@ -1,0 +1,176 @@
+#include "tarsel/words/timespec.h"
+
+#include <charconv>
+#include <cmath>
+#include <cstdio>
+#include <vector>
+
+#include "tarsel/words/failure.h"
+
+namespace {
+
+constexpr long long kTicks = 35280000;              // a second of MediaTime
+constexpr long long kLongest = 1000LL * 3600 * 24;  // seconds; a bound, not a wish
+
+[[noreturn]] void refuse(std::string_view option, std::string_view text, std::string_view wanted) {
+    throw Failure(Exit::usage,
+                  std::string(option) + ": " + inQuotes(text) + " is not " + std::string(wanted));
+}
+
+std::optional<long long> number(std::string_view text) {
+    long long value = 0;
+    const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), value);
+    if (error != std::errc() || end != text.data() + text.size() || text.empty()) return std::nullopt;
+    return value;
+}
+
+std::vector<std::string_view> split(std::string_view text, std::string_view separators) {
+    std::vector<std::string_view> parts;
+    size_t start = 0;
+    for (size_t i = 0; i <= text.size(); ++i) {
+        if (i < text.size() && separators.find(text[i]) == std::string_view::npos) continue;
+        parts.push_back(text.substr(start, i - start));
+        start = i + 1;
+    }
+    return parts;
+}
+
+// "12.345" as ticks, exact to the tick; digits behind the ninth decimal do not count.
+std::optional<long long> secondsToTicks(std::string_view text) {
+    const size_t point = text.find('.');
+    const auto whole = number(text.substr(0, point));
+    if (!whole || *whole < 0 || *whole > kLongest || text[0] == '-') return std::nullopt;
+    long long ticks = *whole * kTicks;
+    if (point == std::string_view::npos) return ticks;
+    std::string_view decimals = text.substr(point + 1, 9);
+    if (decimals.empty()) return std::nullopt;
+    for (char c : text.substr(point + 1))
+        if (c < '0' || c > '9') return std::nullopt;
+    long long value = 0, scale = 1;
+    for (char c : decimals) {
+        value = value * 10 + (c - '0');
+        scale *= 10;
+    }
+    return ticks + static_cast<long long>(static_cast<__int128>(value) * kTicks / scale);
+}
+
+std::optional<MediaTime> clockTime(const std::vector<std::string_view>& parts) {
+    long long seconds = 0;
+    for (size_t i = 0; i + 1 < parts.size(); ++i) {
+        const auto value = number(parts[i]);
+        if (!value || *value < 0 || (i > 0 && *value > 59) || *value > kLongest / 3600) return std::nullopt;
+        seconds = (seconds + *value) * 60;
+    }
+    const auto last = secondsToTicks(parts.back());
+    if (!last || (parts.size() > 1 && *last >= 60 * kTicks)) return std::nullopt;
+    return MediaTime(seconds * kTicks + *last, kTicks);
+}
+
+}  // namespace
+
+MediaTime parseTime(std::string_view text, const std::optional<QvFramerate>& rate, std::string_view option) {
+    constexpr std::string_view wanted =
+        "a time: use SS[.mmm], MM:SS, HH:MM:SS[.mmm], 120f, HH:MM:SS:FF or HH:MM:SS;FF";
+    const auto needRate = [&]() -> const QvFramerate& {
+        if (!rate)
+            throw Failure(Exit::usage, std::string(option) + ": " + inQuotes(text) +
+                                           " counts frames, but the input has no frame rate; give seconds");
+        return *rate;
+    };
+    if (!text.empty() && text.back() == 'f') {
+        const auto frames = number(text.substr(0, text.size() - 1));
+        if (!frames || *frames < 0 || *frames > 0x7FFFFFFF) refuse(option, text, wanted);
+        return MediaTime(static_cast<long long>(*frames), needRate(), kTicks);
+    }
+    const auto parts = split(text, ":;");
+    if (parts.size() == 4) {
+        for (size_t i = 0; i < 4; ++i) {
+            const auto value = number(parts[i]);
+            if (!value || *value < 0 || *value > (i == 0 ? 99 : i == 3 ? 999 : 59))
+                refuse(option, text, wanted);
+        }
+        QvFramerate counting = needRate();
+        const QvTimecode code{std::string(text).c_str()};
+        counting.setDf(code.df());
+        const long long frame = code.frameNr(counting, false);
+        return MediaTime(frame, counting, kTicks);
+    }
+    if (text.find(';') != std::string_view::npos || parts.size() > 3) refuse(option, text, wanted);
+    const auto time = clockTime(parts);
+    if (!time) refuse(option, text, wanted);
+    return *time;
+}
+
+QvFramerate parseRate(std::string_view text, std::string_view option) {
+    constexpr std::string_view wanted = "a frame rate: use 25, 29.97, 30000/1001, or 25i and 25b for fields";
+    std::string_view digits = text;
+    int interlaced = 0;
+    if (!digits.empty() && (digits.back() == 'i' || digits.back() == 'b' || digits.back() == 'p')) {
+        interlaced = digits.back() == 'i' ? 1 : digits.back() == 'b' ? 2 : 0;
+        digits.remove_suffix(1);
+    }
+    if (const auto parts = split(digits, "/"); parts.size() == 2) {
+        const auto num = number(parts[0]), den = number(parts[1]);
+        if (!num || !den || *num < 1 || *den < 1 || *num > 100000000 || *den > 1000000)
+            refuse(option, text, wanted);
+        return QvFramerate(QvRatio(static_cast<int>(*num), static_cast<int>(*den)), interlaced);
+    }
+    double value = 0;
+    const auto [end, error] = std::from_chars(digits.data(), digits.data() + digits.size(), value);
+    if (error != std::errc() || end != digits.data() + digits.size() || !(value >= 0.001 && value <= 100000))
+        refuse(option, text, wanted);
+    return QvFramerate(value, interlaced);
+}
+
+Size parseSize(std::string_view text, std::string_view option) {
+    const auto parts = split(text, "xX");
+    if (parts.size() == 2) {
+        const auto width = number(parts[0]), height = number(parts[1]);
+        if (width && height && *width >= 1 && *height >= 1 && *width <= 65535 && *height <= 65535)
+            return {static_cast<int>(*width), static_cast<int>(*height)};
+    }
+    refuse(option, text, "a size such as 1280x720, each from 1 to 65535");
+}
+
+long long parseNumber(std::string_view text, long long low, long long high, std::string_view option) {
+    const auto value = number(text);
+    if (!value || *value < low || *value > high)
+        refuse(option, text, "a whole number from " + std::to_string(low) + " to " + std::to_string(high));
+    return *value;
+}
+
+unsigned parsePixel(std::string_view text, std::string_view option) {
+    std::vector<std::string> known;
+    for (const QvPixelFormat& format : qvPixelFormats()) {
+        known.push_back(fourccText(format.fourcc));
+        if (text == known.back()) return format.fourcc;
+    }
+    throw Failure(Exit::usage, std::string(option) + ": there is no pixel format " + inQuotes(text) + "." +
+                                   suggestion(text, known) + " 'tarsel formats' lists all");
+}
+
+std::string fourccText(unsigned fourcc) {
+    std::string text;
+    for (int i = 0; i < 4; ++i) text += static_cast<char>(fourcc >> (8 * i) & 0xFF);
+    while (!text.empty() && text.back() == ' ') text.pop_back();
+    return text;
+}
+
+std::string formatTime(double seconds) {
+    if (!(seconds >= 0)) return "unknown";
+    const long long ms = std::llround(seconds * 1000);
+    char text[48];
+    std::snprintf(text, sizeof text, "%lld:%02lld:%02lld.%03lld", ms / 3600000, ms / 60000 % 60,
+                  ms / 1000 % 60, ms % 1000);
+    return text;
+}
+
+std::string formatBytes(long long bytes) {
+    const char* unit[] = {"B", "KiB", "MiB", "GiB", "TiB"};
+    double value = static_cast<double>(bytes);
+    int u = 0;
+    for (; value >= 1024 && u < 4; ++u) value /= 1024;
+    char text[32];
+    std::snprintf(text, sizeof text, u ? "%.1f %s" : "%.0f %s", value, unit[u]);
+    return text;
+}
