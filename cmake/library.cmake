@@ -13,6 +13,9 @@ target_link_libraries(qv_objects PUBLIC
   PkgConfig::FONTCONFIG PkgConfig::HARFBUZZ PkgConfig::FRIBIDI PkgConfig::CRYPTOPP PkgConfig::HWY
   ${CMAKE_DL_LIBS})
 
+qv_precompile(qv_objects <algorithm> <functional> <memory> <string> <vector>
+              ${CMAKE_SOURCE_DIR}/core/value/anycontainer.h)
+
 # <qvplugcore/qvplugcore.h> includes every public header, room by room from the ground up.
 file(STRINGS ${CMAKE_SOURCE_DIR}/tests/lint/rooms.txt QV_ROOMS REGEX "^ *[0-9]+ +core/")
 set(QV_UMBRELLA "// The whole public interface of the engine.\n#pragma once\n\n")

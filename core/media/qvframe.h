@@ -25,7 +25,7 @@ struct frame_tt {
 };
 static_assert(sizeof(frame_tt) == 32 + 4 * sizeof(void*));
 
-enum QvYUVMatrix { qvMatrixNotSet = 0, qvMatrixBT601 = 1, qvMatrixBT709 = 2 };
+enum QvYUVMatrix : int { qvMatrixNotSet = 0, qvMatrixBT601 = 1, qvMatrixBT709 = 2 };
 
 // One block of memory, cut into up to four planes that follow each other. A frame is empty until init, or a
 // copy from another frame, gives it a format; operations on the planes of an empty frame are assertions.

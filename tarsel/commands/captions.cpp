@@ -5,12 +5,12 @@
 #include <string>
 #include <vector>
 
-#include <nlohmann/json.hpp>
-
 #include "tarsel/commands/commands.h"
 #include "tarsel/host/console.h"
 #include "tarsel/source/source.h"
+#include "tarsel/words/commandline.h"
 #include "tarsel/words/failure.h"
+#include "tarsel/words/json.h"
 
 namespace {
 
@@ -40,11 +40,11 @@ void printLine(std::span<const QvCcBytePair> pairs, const QvFramerate& rate, boo
         print("%s\t%d\t%s\t%s\n", time.c_str(), field, bytes.c_str(), text.c_str());
         return;
     }
-    const nlohmann::ordered_json line = {{"time", time},
-                                         {"seconds", pairs.front().time.seconds()},
-                                         {"field", field},
-                                         {"bytes", bytes},
-                                         {"text", text}};
+    const Json line = {{"time", time},
+                       {"seconds", pairs.front().time.seconds()},
+                       {"field", field},
+                       {"bytes", bytes},
+                       {"text", text}};
     print("%s\n", line.dump().c_str());
 }
 
@@ -93,17 +93,14 @@ void showCaptions(const std::vector<std::string>& files, bool json) {
 
 }  // namespace
 
-void addCaptions(CLI::App& app, Action& chosen) {
-    CLI::App* command =
-        app.add_subcommand("captions", "Show the captions of an SCC file: time, field, bytes, text");
+void addCaptions(CommandLine& line) {
+    Command command = line.command("captions", "Show the captions of an SCC file: time, field, bytes, text");
     struct Given {
         std::vector<std::string> files;
         bool json = false;
     };
     auto given = std::make_shared<Given>();
-    command->add_option("FILE", given->files, "SCC file of field 1, and one of field 2")
-        ->required()
-        ->expected(1, 2);
-    command->add_flag("--json", given->json, "Print JSON, one object a line");
-    command->callback([&chosen, given] { chosen = [given] { showCaptions(given->files, given->json); }; });
+    command.arguments("FILE", given->files, "SCC file of field 1, and one of field 2", 2);
+    command.flag("--json", given->json, "Print JSON, one object a line");
+    command.action([given] { showCaptions(given->files, given->json); });
 }

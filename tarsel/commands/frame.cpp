@@ -5,8 +5,10 @@
 
 #include "tarsel/commands/commands.h"
 #include "tarsel/host/outputs.h"
+#include "tarsel/host/signals.h"
 #include "tarsel/picture/picturereader.h"
 #include "tarsel/source/source.h"
+#include "tarsel/words/commandline.h"
 #include "tarsel/words/failure.h"
 #include "tarsel/words/timespec.h"
 
@@ -110,18 +112,16 @@ void frame(Given& given) {
 
 }  // namespace
 
-void addFrame(CLI::App& app, Action& chosen, Signals& signals) {
-    CLI::App* command = app.add_subcommand("frame", "Save one picture of a video, or a contact sheet");
+void addFrame(CommandLine& line, Signals& signals) {
+    Command command = line.command("frame", "Save one picture of a video, or a contact sheet");
     auto given = std::make_shared<Given>();
     given->signals = &signals;
-    command->add_option("FILE", given->input, "A file, or testgen:...")->required();
-    command->add_option("--at", given->at, "The instant: SS.mmm, HH:MM:SS, 120f, HH:MM:SS:FF")
-        ->type_name("TIME");
-    command->add_option("--sheet", given->sheet, "A sheet of COLUMNSxROWS pictures")->type_name("NxM");
-    command->add_option("--raw", given->raw, "Format of a raw file: size=WxH,pixel=FORMAT,rate=R")
-        ->type_name("K=V,...");
-    command->add_option("-o,--output", given->output, "The picture")->type_name("FILE.png")->required();
-    addEffectOptions(*command, given->effects);
-    command->add_flag("-y,--overwrite", given->overwrite, "Overwrite an existing picture");
-    command->callback([&chosen, given] { chosen = [given] { frame(*given); }; });
+    command.argument("FILE", given->input, "A file, or testgen:...");
+    command.option("--at", given->at, "The instant: SS.mmm, HH:MM:SS, 120f, HH:MM:SS:FF", "TIME");
+    command.option("--sheet", given->sheet, "A sheet of COLUMNSxROWS pictures", "NxM");
+    command.option("--raw", given->raw, "Format of a raw file: size=WxH,pixel=FORMAT,rate=R", "K=V,...");
+    command.option("-o,--output", given->output, "The picture", "FILE.png", Need::required);
+    addEffectOptions(command, given->effects);
+    command.flag("-y,--overwrite", given->overwrite, "Overwrite an existing picture");
+    command.action([given] { frame(*given); });
 }

@@ -1,16 +1,14 @@
 #include <cstdio>
 
-#include <nlohmann/json.hpp>
-
 #include "tarsel/commands/commands.h"
 #include "tarsel/host/console.h"
 #include "tarsel/source/source.h"
+#include "tarsel/words/commandline.h"
 #include "tarsel/words/failure.h"
+#include "tarsel/words/json.h"
 #include "tarsel/words/timespec.h"
 
 namespace {
-
-using Json = nlohmann::ordered_json;
 
 std::string text(const Any& value) {
     const Any narrow = value.isWString() ? value.toString() : value;
@@ -166,12 +164,11 @@ void info(const Given& given) {
 
 }  // namespace
 
-void addInfo(CLI::App& app, Action& chosen) {
-    CLI::App* command = app.add_subcommand("info", "Show streams, formats and durations of files");
+void addInfo(CommandLine& line) {
+    Command command = line.command("info", "Show streams, formats and durations of files");
     auto given = std::make_shared<Given>();
-    command->add_option("FILE", given->files, "Files, or testgen:...")->required();
-    command->add_option("--raw", given->raw, "Format of a raw file: size=WxH,pixel=FORMAT,rate=R")
-        ->type_name("K=V,...");
-    command->add_flag("--json", given->json, "Print JSON, one array of files");
-    command->callback([&chosen, given] { chosen = [given] { info(*given); }; });
+    command.arguments("FILE", given->files, "Files, or testgen:...");
+    command.option("--raw", given->raw, "Format of a raw file: size=WxH,pixel=FORMAT,rate=R", "K=V,...");
+    command.flag("--json", given->json, "Print JSON, one array of files");
+    command.action([given] { info(*given); });
 }

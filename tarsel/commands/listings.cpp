@@ -1,15 +1,13 @@
 // What this installation can do: modules, presets and formats.
 #include <map>
 
-#include <nlohmann/json.hpp>
-
 #include "tarsel/commands/commands.h"
 #include "tarsel/host/console.h"
+#include "tarsel/words/commandline.h"
+#include "tarsel/words/json.h"
 #include "tarsel/words/timespec.h"
 
 namespace {
-
-using Json = nlohmann::ordered_json;
 
 const char* kindName(int kind) {
     switch (kind) {
@@ -107,45 +105,40 @@ std::string joined(const Json& list) {
     return text;
 }
 
-void add(CLI::App& app, Action& chosen, const char* name, const char* help, Json (*make)(),
-         void (*show)(const Json&)) {
-    CLI::App* command = app.add_subcommand(name, help);
+void add(CommandLine& line, const char* name, const char* help, Json (*make)(), void (*show)(const Json&)) {
+    Command command = line.command(name, help);
     auto json = std::make_shared<bool>(false);
-    command->add_flag("--json", *json, "Print JSON");
-    command->callback([&chosen, json, make, show] {
-        chosen = [json, make, show] {
-            const Json data = make();
-            if (*json)
-                print("%s\n", data.dump(2).c_str());
-            else
-                show(data);
-        };
+    command.flag("--json", *json, "Print JSON");
+    command.action([json, make, show] {
+        const Json data = make();
+        if (*json)
+            print("%s\n", data.dump(2).c_str());
+        else
+            show(data);
     });
 }
 
 }  // namespace
 
-void addModules(CLI::App& app, Action& chosen) {
-    add(app, chosen, "modules", "List the modules of the library and its plug-ins", modules,
-        [](const Json& list) {
-            for (const auto& m : list)
-                print("%-13s %-14s %s%s\n", m["name"].get<std::string>().c_str(),
-                      m["kind"].get<std::string>().c_str(), m["description"].get<std::string>().c_str(),
-                      m["usable"].get<bool>() ? "" : "  (not usable)");
-        });
+void addModules(CommandLine& line) {
+    add(line, "modules", "List the modules of the library and its plug-ins", modules, [](const Json& list) {
+        for (const auto& m : list)
+            print("%-13s %-14s %s%s\n", m["name"].get<std::string>().c_str(),
+                  m["kind"].get<std::string>().c_str(), m["description"].get<std::string>().c_str(),
+                  m["usable"].get<bool>() ? "" : "  (not usable)");
+    });
 }
 
-void addPresets(CLI::App& app, Action& chosen) {
-    add(app, chosen, "presets", "List the presets that the installed modules allow", presets,
-        [](const Json& list) {
-            for (const auto& p : list)
-                print("%-24s video %s; audio %s; %s\n", p["name"].get<std::string>().c_str(),
-                      joined(p["video"]).c_str(), joined(p["audio"]).c_str(), joined(p["muxers"]).c_str());
-        });
+void addPresets(CommandLine& line) {
+    add(line, "presets", "List the presets that the installed modules allow", presets, [](const Json& list) {
+        for (const auto& p : list)
+            print("%-24s video %s; audio %s; %s\n", p["name"].get<std::string>().c_str(),
+                  joined(p["video"]).c_str(), joined(p["audio"]).c_str(), joined(p["muxers"]).c_str());
+    });
 }
 
-void addFormats(CLI::App& app, Action& chosen) {
-    add(app, chosen, "formats", "List what can be read and written", formats, [](const Json& data) {
+void addFormats(CommandLine& line) {
+    add(line, "formats", "List what can be read and written", formats, [](const Json& data) {
         print("Inputs\n");
         for (const auto& i : data["inputs"])
             print("  %-10s %s: %s\n", i["decoder"].get<std::string>().c_str(),

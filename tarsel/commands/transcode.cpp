@@ -1,5 +1,7 @@
 #include "tarsel/commands/commands.h"
+#include "tarsel/host/signals.h"
 #include "tarsel/job/job.h"
+#include "tarsel/words/commandline.h"
 #include "tarsel/words/timespec.h"
 
 namespace {
@@ -38,37 +40,30 @@ void transcode(Given& given, Signals& signals) {
 
 }  // namespace
 
-void addTranscode(CLI::App& app, Action& chosen, Signals& signals) {
-    CLI::App* command = app.add_subcommand("transcode", "Read INPUTs, convert, and write OUTPUT");
+void addTranscode(CommandLine& line, Signals& signals) {
+    Command command = line.command("transcode", "Read INPUTs, convert, and write OUTPUT");
     auto given = std::make_shared<Given>();
     JobOptions& job = given->job;
-    command->add_option("INPUT", job.inputs, "Files, or testgen:size=1280x720,rate=25,duration=10")
-        ->required();
-    command->add_option("-o,--output", job.output, "What to write; the extension says how")
-        ->type_name("FILE");
-    command->add_option("--raw", job.raw, "Format of a raw input: size=WxH,pixel=FORMAT,rate=R")
-        ->type_name("K=V,...");
-    command->add_option("--from", job.from, "First instant taken: SS.mmm, HH:MM:SS, 120f, HH:MM:SS:FF")
-        ->type_name("TIME");
-    command->add_option("--to", job.to, "First instant not taken")->type_name("TIME");
-    command->add_option("--samplerate", given->samplerate, "Samples a second")->type_name("N");
-    command->add_option("--channels", given->channels, "Channels of the sound, 1 to 8")->type_name("N");
-    command->add_option("--bits", given->bits, "Bits of a sample: 8, 16 or 24")->type_name("N");
-    command->add_option("--muxer", job.muxer, "nullmux: do everything but write")->type_name("NAME");
-    command
-        ->add_option(
-            "--post", job.post,
-            "A command run afterwards; %i and %o stand for the inputs and outputs, %o1 for the first")
-        ->type_name("CMD");
-    command->add_option("--save-task", job.saveTask, "Write the job as a task file")->type_name("FILE");
-    command->add_option("--progress", given->progress, "auto, json (lines on stderr) or none")
-        ->check(CLI::IsMember({"auto", "json", "none"}));
-    command->add_flag("--split-channels", job.splitChannels, "One WAV file a channel");
-    command->add_flag("--accept-partial", job.acceptPartial, "Take what is there of a damaged input");
-    command->add_flag("--dry-run", job.dryRun, "Print the plan and do nothing");
-    command->add_flag("-y,--overwrite", job.overwrite, "Overwrite existing outputs");
-    command->add_flag("-q,--quiet", job.quiet, "Say nothing but errors");
-    addEffectOptions(*command, job.effects);
-    command->callback(
-        [&chosen, &signals, given] { chosen = [&signals, given] { transcode(*given, signals); }; });
+    command.arguments("INPUT", job.inputs, "Files, or testgen:size=1280x720,rate=25,duration=10");
+    command.option("-o,--output", job.output, "What to write; the extension says how", "FILE");
+    command.option("--raw", job.raw, "Format of a raw input: size=WxH,pixel=FORMAT,rate=R", "K=V,...");
+    command.option("--from", job.from, "First instant taken: SS.mmm, HH:MM:SS, 120f, HH:MM:SS:FF", "TIME");
+    command.option("--to", job.to, "First instant not taken", "TIME");
+    command.option("--samplerate", given->samplerate, "Samples a second", "N");
+    command.option("--channels", given->channels, "Channels of the sound, 1 to 8", "N");
+    command.option("--bits", given->bits, "Bits of a sample: 8, 16 or 24", "N");
+    command.option("--muxer", job.muxer, "nullmux: do everything but write", "NAME");
+    command.option("--post", job.post,
+                   "A command run afterwards; %i and %o stand for the inputs and outputs, %o1 for the first",
+                   "CMD");
+    command.option("--save-task", job.saveTask, "Write the job as a task file", "FILE");
+    command.choice("--progress", given->progress, "auto, json (lines on stderr) or none",
+                   {"auto", "json", "none"});
+    command.flag("--split-channels", job.splitChannels, "One WAV file a channel");
+    command.flag("--accept-partial", job.acceptPartial, "Take what is there of a damaged input");
+    command.flag("--dry-run", job.dryRun, "Print the plan and do nothing");
+    command.flag("-y,--overwrite", job.overwrite, "Overwrite existing outputs");
+    command.flag("-q,--quiet", job.quiet, "Say nothing but errors");
+    addEffectOptions(command, job.effects);
+    command.action([&signals, given] { transcode(*given, signals); });
 }

@@ -2,12 +2,10 @@
 
 #include <algorithm>
 #include <cstdio>
-#include <filesystem>
 #include <new>
 
+#include "tarsel/host/files.h"
 #include "tarsel/words/timespec.h"
-
-namespace fs = std::filesystem;
 
 namespace {
 
@@ -69,9 +67,7 @@ void Job::chooseOutput() {
     const std::string extension = QvFile::getExt(Any(options_.output.c_str()), true).asString();
     const auto* row = std::find_if(std::begin(kKinds), std::end(kKinds),
                                    [&](const KindRow& r) { return extension == r.extension; });
-    std::error_code error;
-    const auto status = fs::status(options_.output, error);
-    const bool device = fs::exists(status) && !fs::is_regular_file(status) && !fs::is_directory(status);
+    const bool device = isDevice(options_.output);
     if (row == std::end(kKinds) && !device) {
         std::vector<std::string> known;
         for (const auto& r : kKinds) known.push_back(r.extension);

@@ -2,6 +2,7 @@
 #include <algorithm>
 #include <filesystem>
 
+#include "tarsel/host/files.h"
 #include "tarsel/job/job.h"
 
 namespace fs = std::filesystem;
@@ -53,17 +54,14 @@ void Job::checkResult() {
 
 void Job::checkFiles() const {
     const std::vector<fs::path> files = outputs_->written();
-    std::error_code error;
     size_t sound = 0, raw = 0;
     const auto sounds = ofExtension(files, ".wav"), raws = ofExtension(files, ".raw");
     long long pictures = 0;
     for (const JobStream& s : streams_) {
         if (s.type == 1 && kind_ == OutputKind::pictures) pictures += s.written;
         if (s.type == 1 && kind_ == OutputKind::raw) {
-            const auto bytes = raw < raws.size() ? fs::file_size(raws[raw++], error) : 0;
-            if (error || static_cast<long long>(bytes) != s.bytes(s.written))
-                differs(options_.output, error ? -1 : static_cast<long long>(bytes), s.bytes(s.written),
-                        "bytes");
+            const long long bytes = raw < raws.size() ? fileBytes(raws[raw++]) : 0;
+            if (bytes != s.bytes(s.written)) differs(options_.output, bytes, s.bytes(s.written), "bytes");
         }
         if (s.type != 2 || kind_ == OutputKind::avi) continue;
         for (int part = 0; part < (options_.splitChannels ? s.channels : 1); ++part) {

@@ -2,28 +2,24 @@
 
 #include <cmath>
 #include <cstdio>
-#include <cstdlib>
 
-#include <sys/ioctl.h>
-#include <unistd.h>
-#include <nlohmann/json.hpp>
+#include <qvplugcore/qvplugcore.h>
 
+#include "tarsel/host/terminal.h"
+#include "tarsel/words/json.h"
 #include "tarsel/words/timespec.h"
 
 namespace {
 
-constexpr auto kLineInterval = std::chrono::milliseconds(100);
-constexpr auto kJsonInterval = std::chrono::milliseconds(500);
+constexpr double kLineInterval = 0.1;  // seconds
+constexpr double kJsonInterval = 0.5;
 
-nlohmann::ordered_json orNull(double value) {
-    return std::isfinite(value) && value >= 0 ? nlohmann::ordered_json(value)
-                                              : nlohmann::ordered_json(nullptr);
-}
+Json orNull(double value) { return std::isfinite(value) && value >= 0 ? Json(value) : Json(nullptr); }
 
 // Cut to the terminal's width: a line that wraps can't be overwritten.
 std::string fitted(const std::string& text) {
-    winsize size{};
-    if (ioctl(STDERR_FILENO, TIOCGWINSZ, &size) != 0 || size.ws_col == 0) return text;
+    const int width = terminalColumns();
+    if (width == 0) return text;
     std::string cut;
     int columns = 0;
     for (size_t i = 0; i < text.size(); ++i) {
@@ -31,7 +27,7 @@ std::string fitted(const std::string& text) {
             const size_t end = text.find('m', i);
             cut += text.substr(i, end - i + 1);
             i = end;
-        } else if (columns++ < size.ws_col - 1) {
+        } else if (columns++ < width - 1) {
             cut += text[i];
         }
     }
@@ -44,9 +40,8 @@ double round1(double value) { return std::round(value * 10) / 10; }
 
 Progress::Progress(ProgressMode mode, std::string label) : label_(std::move(label)) {
     json_ = mode == ProgressMode::json;
-    line_ = mode == ProgressMode::automatic && isatty(STDERR_FILENO) == 1;
-    const char* noColor = std::getenv("NO_COLOR");
-    color_ = line_ && !(noColor && *noColor);
+    line_ = mode == ProgressMode::automatic && stderrIsTerminal();
+    color_ = line_ && colourWanted();
 }
 
 Progress::~Progress() {
@@ -54,13 +49,13 @@ Progress::~Progress() {
 }
 
 void Progress::start() {
-    begin_ = Clock::now();
+    begin_ = QvTimer::absoluteTime();
     if (json_ || line_) show("start", ProgressState{0, 0, 0, 1, 1, "running"});
 }
 
 bool Progress::due() const {
     if (!json_ && !line_) return false;
-    return Clock::now() - last_ >= (json_ ? kJsonInterval : kLineInterval);
+    return QvTimer::absoluteTime() - last_ >= (json_ ? kJsonInterval : kLineInterval);
 }
 
 void Progress::update(const ProgressState& state) {
@@ -74,8 +69,8 @@ void Progress::finish(const ProgressState& state) {
 }
 
 void Progress::show(const char* event, const ProgressState& state) {
-    last_ = Clock::now();
-    const double elapsed = std::chrono::duration<double>(last_ - begin_).count();
+    last_ = QvTimer::absoluteTime();
+    const double elapsed = last_ - begin_;
     const double eta = state.part > 0 ? elapsed * (1 - state.part) / state.part : -1;
     if (json_)
         showJson(event, state, elapsed, eta);
@@ -103,10 +98,10 @@ void Progress::showLine(const ProgressState& state, double elapsed, double eta) 
 }
 
 void Progress::showJson(const char* event, const ProgressState& state, double elapsed, double eta) {
-    nlohmann::ordered_json line;
+    Json line;
     line["event"] = event;
-    line["percent"] = state.part < 0 ? nlohmann::ordered_json(nullptr) : orNull(round1(state.part * 100));
-    line["eta_s"] = eta < 0 ? nlohmann::ordered_json(nullptr) : orNull(round1(eta));
+    line["percent"] = state.part < 0 ? Json(nullptr) : orNull(round1(state.part * 100));
+    line["eta_s"] = eta < 0 ? Json(nullptr) : orNull(round1(eta));
     line["pass"] = state.pass;
     line["passes"] = state.passes;
     line["frame"] = state.frame;

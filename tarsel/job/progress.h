@@ -1,7 +1,6 @@
 // What a person or a program sees while a job runs: one line on a terminal, JSON lines, or nothing.
 #pragma once
 
-#include <chrono>
 #include <string>
 
 struct ProgressState {
@@ -33,12 +32,11 @@ class Progress {
     bool onTerminal() const { return line_; }
 
   private:
-    using Clock = std::chrono::steady_clock;
     void show(const char* event, const ProgressState& state);
     void showLine(const ProgressState& state, double elapsed, double eta);
     void showJson(const char* event, const ProgressState& state, double elapsed, double eta);
 
     std::string label_;
     bool line_ = false, json_ = false, shown_ = false, color_ = false;
-    Clock::time_point begin_ = Clock::now(), last_{};
+    double begin_ = 0, last_ = 0;  // seconds of the system's counter
 };

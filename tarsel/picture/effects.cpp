@@ -1,5 +1,6 @@
 #include "tarsel/picture/effects.h"
 
+#include "tarsel/words/commandline.h"
 #include "tarsel/words/timespec.h"
 
 std::string EffectOptions::given() const {
@@ -33,39 +34,32 @@ void EffectOptions::check() const {
     if (!pixel.empty()) parsePixel(pixel, "--pixel");
 }
 
-void addEffectOptions(CLI::App& command, EffectOptions& options) {
-    const auto text = [&](const char* names, std::string& value, const char* help, const char* type) {
-        command.add_option(names, value, help)->type_name(type)->group("Picture");
-    };
-    const auto flag = [&](const char* names, std::string& value, const char* help, const char* type) {
-        command.add_flag(names, value, help)->type_name(type)->group("Picture");
-    };
-    text("--size", options.size, "Size of the output", "WxH");
-    text("--rate", options.rate, "Frames a second: 25, 30000/1001, 25i", "RATE");
-    text("--pixel", options.pixel, "Pixel format, see 'tarsel formats'", "FOURCC");
-    text("--matrix", options.matrix, "YUV matrix of the output, or of input and output", "[IN:]601|709");
-    flag("--deinterlace", options.deinterlace, "top (unless said), bottom, bob, double or reverse",
-         "[=METHOD]");
-    text("--crop", options.crop, "The part to keep; -X and -Y count from the right and the bottom",
-         "WxH[+X+Y]|W:H");
-    command.add_flag("--flip", options.flip, "Turn the picture upside down")->group("Picture");
-    command
-        .add_option("--logo", options.logos, "Draw a picture; -X and -Y count from the right and the bottom")
-        ->type_name("FILE@X,Y[,OPACITY]")
-        ->allow_extra_args(false)
-        ->group("Picture");
-    text("--subtitles", options.subtitles, "Burn in the subtitles of an .srt or .sub file", "FILE");
-    text("--subtitle-style", options.subtitleStyle,
-         "Keys size, color, font, effect, encoding, delay, speed, rate", "K=V,...");
-    flag("--timecode", options.timecode,
-         "Burn in the timecode of the input, or from START on; keys start, mode=frames, x, y, size, color, "
-         "font",
-         "[=START|K=V,...]");
-    text("--fade", options.fade, "Fade in from black over IN, and to black over OUT, or IN as well",
-         "IN[,OUT]");
-    command
-        .add_option("--filter", options.filters,
-                    "Any filter, see 'tarsel modules'; \\, and \\\\ stand for , and \\ in a value")
-        ->type_name("NAME[:K=V,...]")
-        ->allow_extra_args(false);
+void addEffectOptions(Command& command, EffectOptions& options) {
+    command.group("Picture");
+    command.option("--size", options.size, "Size of the output", "WxH");
+    command.option("--rate", options.rate, "Frames a second: 25, 30000/1001, 25i", "RATE");
+    command.option("--pixel", options.pixel, "Pixel format, see 'tarsel formats'", "FOURCC");
+    command.option("--matrix", options.matrix, "YUV matrix of the output, or of input and output",
+                   "[IN:]601|709");
+    command.flagOrValue("--deinterlace", options.deinterlace,
+                        "top (unless said), bottom, bob, double or reverse", "[=METHOD]");
+    command.option("--crop", options.crop, "The part to keep; -X and -Y count from the right and the bottom",
+                   "WxH[+X+Y]|W:H");
+    command.flag("--flip", options.flip, "Turn the picture upside down");
+    command.list("--logo", options.logos, "Draw a picture; -X and -Y count from the right and the bottom",
+                 "FILE@X,Y[,OPACITY]");
+    command.option("--subtitles", options.subtitles, "Burn in the subtitles of an .srt or .sub file", "FILE");
+    command.option("--subtitle-style", options.subtitleStyle,
+                   "Keys size, color, font, effect, encoding, delay, speed, rate", "K=V,...");
+    command.flagOrValue(
+        "--timecode", options.timecode,
+        "Burn in the timecode of the input, or from START on; keys start, mode=frames, x, y, size, "
+        "color, font",
+        "[=START|K=V,...]");
+    command.option("--fade", options.fade, "Fade in from black over IN, and to black over OUT, or IN as well",
+                   "IN[,OUT]");
+    command.group("");
+    command.list("--filter", options.filters,
+                 "Any filter, see 'tarsel modules'; \\, and \\\\ stand for , and \\ in a value",
+                 "NAME[:K=V,...]");
 }

@@ -4,7 +4,7 @@
 #include <string>
 #include <vector>
 
-#include <CLI/CLI.hpp>
+class Command;
 
 // As they were given; empty when they were not.
 struct EffectOptions {
@@ -20,4 +20,4 @@ struct EffectOptions {
     void check() const;
 };
 
-void addEffectOptions(CLI::App& command, EffectOptions& options);
+void addEffectOptions(Command& command, EffectOptions& options);

@@ -3,8 +3,8 @@
 #include <algorithm>
 #include <charconv>
 #include <cmath>
-#include <filesystem>
 
+#include "tarsel/host/files.h"
 #include "tarsel/words/failure.h"
 #include "tarsel/words/keyvalues.h"
 #include "tarsel/words/timespec.h"
@@ -17,16 +17,8 @@ constexpr int kLeastText = 14;    // pixels
 constexpr int kShadow = 2;        // fontEffect
 
 void checkFile(const std::string& name, const std::string& option) {
-    std::error_code error;
-    const auto status = std::filesystem::status(name, error);
-    const auto refuse = [&](const std::string& why) {
+    if (const std::string why = whyNoFile(name); !why.empty())
         throw Failure(Exit::input, option + ": can't open " + inQuotes(name) + ": " + why);
-    };
-    if (std::filesystem::is_directory(status)) refuse("this is a folder");
-    if (!std::filesystem::exists(status))
-        refuse(error && error != std::errc::no_such_file_or_directory ? inLine(error.message())
-                                                                      : "no such file");
-    if (!std::filesystem::is_regular_file(status)) refuse("this is no regular file");
 }
 
 constexpr struct {
@@ -119,8 +111,7 @@ Placed parsePlaced(const std::string& spec) {
     }
     if (good) return placed;
     // A name may hold an "@" as well.
-    std::error_code error;
-    if (std::filesystem::exists(spec, error)) return {spec, 0, 0, {}};
+    if (exists(spec)) return {spec, 0, 0, {}};
     throw Failure(Exit::usage,
                   "--logo: " + inQuotes(spec) + ": " + inQuotes(std::string_view(spec).substr(at)) +
                       " is no place: use FILE@X,Y or FILE@X,Y,OPACITY with an opacity from 0 to 1");

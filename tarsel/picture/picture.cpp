@@ -3,14 +3,12 @@
 #include <algorithm>
 #include <charconv>
 #include <cstring>
-#include <filesystem>
 
+#include "tarsel/host/files.h"
 #include "tarsel/picture/overlays.h"
 #include "tarsel/words/failure.h"
 #include "tarsel/words/keyvalues.h"
 #include "tarsel/words/timespec.h"
-
-namespace fs = std::filesystem;
 
 namespace {
 
@@ -363,9 +361,7 @@ std::string filterFile(const QvCodec& filter, int guiControl) {
 void checkFilterFiles(const QvVProcessPipe& pipe, const std::vector<std::string>& inputs,
                       const Outputs* outputs, bool overwrite) {
     const auto checkOutput = [&](const std::string& name, const char* what) {
-        std::error_code error;
-        if (outputs && !outputs->isDevice() &&
-            fs::weakly_canonical(name, error) == fs::weakly_canonical(outputs->output(), error))
+        if (outputs && !outputs->isDevice() && samePlace(name, outputs->output()))
             throw Failure(Exit::output, "can't write " + inQuotes(name) + ": it is also " + what);
     };
     std::vector<std::string> read = inputs;

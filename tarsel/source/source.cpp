@@ -1,11 +1,9 @@
 #include "tarsel/source/source.h"
 
 #include <algorithm>
-#include <cerrno>
 #include <cstdio>
-#include <cstring>
-#include <filesystem>
 
+#include "tarsel/host/files.h"
 #include "tarsel/words/failure.h"
 #include "tarsel/words/keyvalues.h"
 #include "tarsel/words/timespec.h"
@@ -100,21 +98,7 @@ Source::Source(const std::string& spec, const std::string& raw) : name_(spec) {
         openGenerator(spec);
         return;
     }
-    std::error_code error;
-    const auto status = std::filesystem::status(spec, error);
-    if (!std::filesystem::exists(status))
-        refuse(error && error != std::errc::no_such_file_or_directory ? inLine(error.message())
-                                                                      : "no such file");
-    if (std::filesystem::is_directory(status)) refuse("this is a folder");
-    if (std::filesystem::is_regular_file(status)) {
-        if (std::filesystem::file_size(spec, error) == 0 && !error) refuse("the file is empty");
-        if (FILE* file = std::fopen(spec.c_str(), "rb"))
-            std::fclose(file);
-        else
-            refuse(std::strerror(errno));
-    } else {
-        refuse("this is no regular file");
-    }
+    if (const std::string why = whyNoInput(spec); !why.empty()) refuse(why);
     if (raw.empty())
         openFile();
     else
@@ -158,7 +142,7 @@ void Source::openGenerator(const std::string& spec) {
     if (const std::string* aspect = keys.find("aspect"))
         video.set("frameAspect", parseAspect(*aspect, option + ": aspect"));
     if (const std::string* picture = keys.find("picture")) {
-        if (!std::filesystem::is_regular_file(*picture))
+        if (!isRegularFile(*picture))
             throw Failure(Exit::input, "can't open the picture " + inQuotes(*picture));
         video.set("picture", picture->c_str());
     }
@@ -251,11 +235,7 @@ void Source::openFile() {
     refuse(reasonOf(candidates));
 }
 
-long long Source::bytes() const {
-    std::error_code error;
-    const auto size = isFile_ ? std::filesystem::file_size(name_, error) : 0;
-    return isFile_ && !error ? static_cast<long long>(size) : -1;
-}
+long long Source::bytes() const { return isFile_ ? fileBytes(name_) : -1; }
 
 std::optional<QvFramerate> Source::frameRate() const {
     if (decoder_->nrStreams(1) == 0) return std::nullopt;

@@ -3,6 +3,7 @@
 usage: rooms.py [TREE]      checks the tree (default: the working folder)
        rooms.py --table     prints the rooms as the table of docs/architecture.md
 """
+import os
 import pathlib
 import re
 import sys
@@ -30,17 +31,16 @@ def include_faults(tree, file, rooms):
     own = str(file.relative_to(tree).parent)
     if own not in rooms:
         return [f"{file}: the folder {own} is no room of rooms.txt"]
-    # Only the core's files and what a tree sees as "core/..." have floors; the tool and plug-ins see what is installed.
     faults = []
     for line in file.read_text(errors="replace").splitlines():
-        found = re.match(r'\s*#\s*include\s*"([^"]+)"', line)
+        found = re.match(r'\s*#\s*include\s*(?:"|<(?=(?:core|builtin|plugins|tarsel|tests)/))([^">]+)', line)
         if not found or found[1] == "soundbytes_data.inc":  # made by the build
             continue
-        other = str(pathlib.PurePosixPath(found[1]).parent)
+        other = os.path.normpath(os.path.dirname(found[1]))
         if other not in rooms:
             faults.append(f"{file}: includes {found[1]}, which is in no room")
         elif own.split("/")[0] in ("tarsel", "plugins") and other.split("/")[0] != own.split("/")[0]:
-            faults.append(f"{file}: includes {found[1]}; here only installed headers of the engine serve")
+            faults.append(f"{file}: includes {found[1]}; here use installed headers, <qvplugcore/...>")
         elif other != own and rooms[other][0] >= rooms[own][0]:
             faults.append(f"{file}: includes {found[1]}, which is not below it")
     return faults

@@ -64,6 +64,23 @@ class Installed : public Tool {
     }
 };
 
+// A header that has moved is found under the name that programs have written so far.
+TEST_F(Installed, HeadersUnderTheirFormerNames) {
+    std::istringstream rows(TempFolder::read(std::string(kSources) + "/cmake/formerheaders.txt"));
+    std::string program;
+    for (std::string former, now; rows >> former;)
+        if (former[0] == '#')
+            std::getline(rows, former);
+        else if (rows >> now)
+            program += "#include <qvplugcore/" + former + ">\n";
+    const std::string source = folder.write("former.cpp", program + "QvCodec* codec = nullptr;\n");
+    EXPECT_THAT(program, HasSubstr("core/engine/qvcodec.h"));
+    const std::string headers = "-I" + folder.file("tree/include");
+    const Outcome o = runProgram(
+        {QV_COMPILER, "-std=c++20", "-fsyntax-only", headers, headers + "/qvplugcore", source}, here());
+    EXPECT_EQ(o.status, 0) << o.err;
+}
+
 TEST_F(Installed, ByPackageAndByPkgConfig) {
     const std::string program = folder.file("tree/bin/tarsel");
     EXPECT_THAT(runProgram({program, "--version"}, here()).out, HasSubstr("tarsel 2."));

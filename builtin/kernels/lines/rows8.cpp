@@ -341,7 +341,7 @@ void rgbToYuv(const ToYuv& rows, const Byte* b, const Byte* g, const Byte* r, By
 #endif
     for (; i < n; ++i) {
         const Byte bgr[3] = {b[i], g[i], r[i]};
-        yuvOne(rows, bgr, y + i, u ? u + i : nullptr, v + i);
+        yuvOne(rows, bgr, y + i, u ? u + i : nullptr, u ? v + i : nullptr);
     }
 }
 

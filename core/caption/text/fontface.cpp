@@ -1,15 +1,18 @@
 #include <algorithm>
 #include <cmath>
 #include <cstddef>
+#include <cstdio>
 #include <cstdlib>
 #include <cstring>
 #include <functional>
+#include <memory>
 #include <new>
 #include <string>
 #include <utility>
 
 #include <hb-ft.h>
 
+#include "core/arch/platform.h"
 #include "core/caption/text/fontface_p.h"
 #include "core/engine/files/qvfileutil.h"
 #include "core/engine/log/qvlog.h"
@@ -40,6 +43,39 @@ void copyBitmap(const FT_Bitmap& bitmap, FontGlyph& glyph) {
     auto out = glyph.coverage.begin();
     for (int y = 0; y < glyph.rows; ++y)
         for (int x = 0; x < glyph.width; ++x) *out++ = coverageAt(bitmap, rowOf(bitmap, y), x);
+}
+
+// Null if the file can't be opened or has no length. FreeType calls `close`, whatever becomes of the face.
+FT_Stream openFont(const char* name) {
+    QvPlatform& platform = qv_platform();
+    QvFileStatus status;
+    if (!platform.status(name, status) || status.size <= 0) return nullptr;
+    auto stream = std::make_unique<FT_StreamRec>();
+    std::FILE* file = platform.openFile(name, "rb");
+    if (!file) return nullptr;
+    stream->size = static_cast<unsigned long>(status.size);
+    stream->descriptor.pointer = file;
+    // A count of 0 only moves; the result is 0 for success then.
+    stream->read = [](FT_Stream self, unsigned long offset, unsigned char* to,
+                      unsigned long count) -> unsigned long {
+        auto* from = static_cast<std::FILE*>(self->descriptor.pointer);
+        const bool moved = qv_platform().seek(from, static_cast<long long>(offset), SEEK_SET) == 0;
+        if (count == 0) return moved ? 0 : 1;
+        return moved ? std::fread(to, 1, count, from) : 0;
+    };
+    stream->close = [](FT_Stream self) {
+        std::fclose(static_cast<std::FILE*>(self->descriptor.pointer));
+        delete self;
+    };
+    return stream.release();
+}
+
+FT_Error openFace(FT_Library library, const char* name, FT_Face& face) {
+    if (!library) return FT_Err_Invalid_Library_Handle;
+    FT_Open_Args source{};
+    source.flags = FT_OPEN_STREAM;
+    source.stream = openFont(name);
+    return source.stream ? FT_Open_Face(library, &source, 0, &face) : FT_Error(FT_Err_Cannot_Open_Resource);
 }
 
 }  // namespace
@@ -106,7 +142,7 @@ void FontFace::load(FontLibrary& library, const Any& file, int pixels, double pi
     library_ = &library;
     const std::string name = qv_os_name(file);
     FT_Face face = nullptr;
-    const FT_Error error = FT_New_Face(library.get(), name.c_str(), 0, &face);
+    const FT_Error error = openFace(library.get(), name.c_str(), face);
     if (error != 0) {
         library.checkMemory();
         if (error == FT_Err_Unknown_File_Format)

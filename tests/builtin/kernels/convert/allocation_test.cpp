@@ -13,20 +13,23 @@
 
 TEST(Memory, IsTakenForTheFirstPictureOnly) {
     std::vector<unsigned char> from(64 * 48 * 8, 3), to(96 * 80 * 8);
-    for (const auto& [source, target, flags] :
-         {std::tuple{"I420", "BGR4", QvScale::standard},
-          {"BGR3", "v210", QvScale::high | QvScale::interlaced},
-          {"YUYV", "I420", QvScale::standard | QvScale::source601 | QvScale::target709}}) {
+    const struct {
+        const char *source, *target;
+        unsigned flags;
+    } cases[] = {{"I420", "BGR4", QvScale::standard},
+                 {"BGR3", "v210", QvScale::high | QvScale::interlaced},
+                 {"YUYV", "I420", QvScale::standard | QvScale::source601 | QvScale::target709}};
+    for (const auto& c : cases) {
         const auto run = [&](int count) {
             for (int i = 0; i < count; ++i)
-                ASSERT_EQ(SRScaler(QvScale::oneThread, codeOf(source), from.data(), 0, 64, 48, codeOf(target),
-                                   to.data(), 0, 96, 80, 0, flags, nullptr),
+                ASSERT_EQ(SRScaler(QvScale::oneThread, codeOf(c.source), from.data(), 0, 64, 48,
+                                   codeOf(c.target), to.data(), 0, 96, 80, 0, c.flags, nullptr),
                           1);
         };
         run(2);
         const int before = allocations;
         run(5);
-        EXPECT_EQ(allocations, before) << source << " to " << target;
+        EXPECT_EQ(allocations, before) << c.source << " to " << c.target;
     }
 }
 

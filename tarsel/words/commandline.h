@@ -1,0 +1,71 @@
+// The command line: what the tool's commands take, and what was given. The only unit that knows the argument
+// parser.
+#pragma once
+
+#include <functional>
+#include <memory>
+#include <optional>
+#include <string>
+#include <vector>
+
+namespace CLI {
+class App;
+}
+
+enum class Need { optional, required };
+
+// One command as it is described. What is given goes into the targets, which live until the command has run.
+// Names are
+// "-o,--output"; `type` is what the help shows for the value.
+class Command {
+  public:
+    explicit Command(CLI::App& app) : app_(app) {}
+
+    // The words that are no options: one, or up to `most` of them, and at least one.
+    void argument(const char* name, std::string& to, const char* help);
+    void arguments(const char* name, std::vector<std::string>& to, const char* help,
+                   int most = 0);  // 0: any number
+
+    void option(const char* names, std::string& to, const char* help, const char* type,
+                Need need = Need::optional);
+    // One value each time that it is given.
+    void list(const char* names, std::vector<std::string>& to, const char* help, const char* type);
+    void choice(const char* names, std::string& to, const char* help, const std::vector<std::string>& values);
+    void flag(const char* names, bool& to, const char* help);
+    // With or without "=VALUE"; "true" without.
+    void flagOrValue(const char* names, std::string& to, const char* help, const char* type);
+    // The heading in the help of the options that follow; "" ends it.
+    void group(const char* heading) { group_ = heading; }
+
+    // What runs when this command was given, once the whole line has been read.
+    void action(std::function<void()> run);
+
+  private:
+    friend class CommandLine;
+    CLI::App& app_;
+    std::string group_;
+    std::function<void()>* chosen_ = nullptr;
+};
+
+class CommandLine {
+  public:
+    CommandLine(const char* description, const std::string& version);
+    ~CommandLine();
+    CommandLine(const CommandLine&) = delete;
+    CommandLine& operator=(const CommandLine&) = delete;
+
+    // Of the tool itself, before the command; `variable` is the environment's, or null.
+    void option(const char* names, std::string& to, const char* help, const char* type, const char* variable);
+    Command command(const char* name, const char* help);
+
+    struct Parsed {
+        std::string text;              // help or version, when these were asked for
+        std::function<void()> action;  // of the command otherwise
+    };
+    // Throws Failure (usage), with near matches for an unknown name.
+    Parsed parse(int argc, char** argv);
+
+  private:
+    std::unique_ptr<CLI::App> app_;
+    std::function<void()> chosen_;
+};
