@@ -1,8 +1,7 @@
-"""A build folder in which one object is exchanged at a time: compiles a changed source, links it into programs of
-the tests and runs these.
+"""A build folder that compiles changed sources, links them into the tests' programs and runs these.
 
-Nothing is written but in folders of the build that are gone afterwards. A changed source is compiled with the command
-of the original. Its object is linked before the library, where it defines all that the original would be taken for.
+A changed source lies in a temporary folder of the build and is compiled with the command of the original. Its object
+comes before the library in the link. It defines what the original defines, so the linker leaves that one out.
 """
 import contextlib
 import itertools
@@ -20,6 +19,7 @@ import time
 HERE = pathlib.Path(__file__).resolve().parent
 ROOT = HERE.parents[1]
 BUILD_PATIENCE, LEAST_PATIENCE = 600, 30  # seconds
+UNCONFINED = 125  # the status of confine.py when it could not do its work
 
 
 class Failure(Exception):
@@ -121,8 +121,12 @@ class Workshop:
         return scratch / program if status == 0 else None
 
     def test(self, path, program, scratch):
-        command = [sys.executable, HERE / "confine.py", scratch, path, "--gtest_brief=1", "--gtest_fail_fast"]
-        return self.processes.run(command, ROOT, scratch, self.patience[program])
+        with tempfile.TemporaryDirectory(prefix="tmp-", dir=scratch, ignore_cleanup_errors=True) as folder:
+            command = [sys.executable, HERE / "confine.py", folder, path, "--gtest_brief=1", "--gtest_fail_fast"]
+            status, output = self.processes.run(command, ROOT, scratch, self.patience[program])
+        if status == UNCONFINED:
+            raise Failure(output)
+        return status, output
 
     def verdict(self, mutant, programs):
         """What the programs make of a mutant: killed, timed out, survived, equivalent or did not compile."""

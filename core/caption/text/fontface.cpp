@@ -1,4 +1,5 @@
 #include <algorithm>
+#include <cerrno>
 #include <cmath>
 #include <cstddef>
 #include <cstdio>
@@ -51,7 +52,9 @@ FT_Stream openFont(const char* name) {
     QvFileStatus status;
     if (!platform.status(name, status) || status.size <= 0) return nullptr;
     auto stream = std::make_unique<FT_StreamRec>();
+    errno = 0;
     std::FILE* file = platform.openFile(name, "rb");
+    if (!file && errno == ENOMEM) throw std::bad_alloc();  // not a font that is missing
     if (!file) return nullptr;
     stream->size = static_cast<unsigned long>(status.size);
     stream->descriptor.pointer = file;
