@@ -1,7 +1,7 @@
 #!/usr/bin/env python3
 """Shows whether the tests notice faults: changes a source in one place, builds that and runs the tests of its room.
 
-    tests/mutate/mutate.py [--seed N] [--count N] [--wide] [--list] [--all | FILE...]
+    tests/mutate/mutate.py [--seed N] [--count N] [--wide] [--verbose] [--list] [--all | FILE...]
 
 FILE is a source of core or builtin, or a folder of them. Without any, and without --all, the sources are those that
 differ from origin/main, or from the commit before this one if there is no such branch. A seed always gives the same
@@ -74,7 +74,8 @@ def drawn(files, seed):
 
 def programs_of(files, wide):
     """The test programs of each file, in the order in which they run."""
-    tests = (path.relative_to(ROOT / "tests") for floor in FLOORS for path in ROOT.glob(f"tests/{floor}/*/**/*_test.cpp"))
+    tests = (path.relative_to(ROOT / "tests") for path in ROOT.glob("tests/*/*/**/*_test.cpp"))
+    tests = (path for path in tests if path.parts[0] in FLOORS)
     rooms = {room: "test_" + "_".join(room) for room in sorted(path.parts[:2] for path in tests)}
     programs = {}
     for file in files:
@@ -175,6 +176,7 @@ def main():
     if not candidates:
         print("nothing to change: no source of core or builtin is named or differs")
     elif options.list:
+        signal.signal(signal.SIGPIPE, signal.SIG_DFL)
         print(*candidates[:options.count], sep="\n")
     else:
         for number in (signal.SIGINT, signal.SIGTERM):

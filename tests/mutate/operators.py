@@ -59,8 +59,8 @@ LEFT_ALONE = re.compile("|".join([
     r"^[ \t]*template <[^\n]*",
     r"\balignas\([^)]*\)",
     r"^[ \t]*HWY_(?:EXPORT|BEFORE|AFTER)\w*\([^;]*",
-    r"(?<!return )(?<!else )(?<=[\w>] )\w+\[\d+\]",  # the size of an array
-    r"\{[\w:]+, *\{?\"+(?:, *\"+)*\}?\}",            # the row of a list: a number and its texts
+    r"(?<!return )(?<!else )(?:(?<=[\w>] )|(?<=\w\* ))\w+\[\d+\]",  # the size of an array
+    r"\{[\w:]+, *\{?\"+(?:, *\"+)*\}?\}",  # the row of a list: a number and its texts
     r"[\w.>-]+reserve\([^;]*",
     r"(?:(?<=[;{})\n])|(?<=else))\s*(?:[\w:]+(?:\(\))?(?:\.|->))*(?:debug|warning|info|error|v?logs?|log[A-Z]\w*|"
     r"warn(?:[A-Z]\w*)?|(?:QvUtil::)?debugOut\w*|_traceParam|QV_STEP_LOG|QV_FAIL\w*)\([^;]*",
@@ -121,6 +121,7 @@ template <int N = 3> struct A;
 static_assert(sizeof(int) == 4, "x");
 int f(const char* text, std::array<int, 4>& a, int* n) {
     char name[16];
+    const char* all[7];
     a[1] = 7 - 'x' * 0x10 + 2.5;  // a + b
     if (!text && *n >= 0) return g(text);
     log.debug("%d", 1 + 1);
@@ -132,27 +133,27 @@ constexpr Row rows[] = {{3, "a"}, {"b", 3}};
 """
 
 CHANGED = """\
-6: * to /: a[1] = 7 - 'x' / 0x10 + 2.5;  // a + b
-6: + to -: a[1] = 7 - 'x' * 0x10 - 2.5;  // a + b
-6: - to +: a[1] = 7 + 'x' * 0x10 + 2.5;  // a + b
-6: 1 to 0: a[0] = 7 - 'x' * 0x10 + 2.5;  // a + b
-6: assignment removed: ;  // a + b
-6: n to n+1: a[1] = 8 - 'x' * 0x10 + 2.5;  // a + b
-7: ! dropped: if (text && *n >= 0) return g(text);
-7: && to ||: if (!text || *n >= 0) return g(text);
-7: 0 to 1: if (!text && *n >= 1) return g(text);
-7: >= to >: if (!text && *n > 0) return g(text);
-7: return of {}: if (!text && *n >= 0) return {};
-9: call removed: ;
-10: < to <=: for (; *n <= 3; ++*n) break;
-10: break to continue: for (; *n < 3; ++*n) continue;
-10: n to n+1: for (; *n < 4; ++*n) break;
-11: 0 to 1: /* a < b */ return true ? std::min(a[1], 1'000) : n->size;
-11: ?: swapped: /* a < b */ return true ? n->size : std::min(a[0], 1'000);
-11: min to max: /* a < b */ return true ? std::max(a[0], 1'000) : n->size;
-11: n to n+1: /* a < b */ return true ? std::min(a[0], 1001) : n->size;
-11: true to false: /* a < b */ return false ? std::min(a[0], 1'000) : n->size;
-13: n to n+1: constexpr Row rows[] = {{3, "a"}, {"b", 4}};
+7: * to /: a[1] = 7 - 'x' / 0x10 + 2.5;  // a + b
+7: + to -: a[1] = 7 - 'x' * 0x10 - 2.5;  // a + b
+7: - to +: a[1] = 7 + 'x' * 0x10 + 2.5;  // a + b
+7: 1 to 0: a[0] = 7 - 'x' * 0x10 + 2.5;  // a + b
+7: assignment removed: ;  // a + b
+7: n to n+1: a[1] = 8 - 'x' * 0x10 + 2.5;  // a + b
+8: ! dropped: if (text && *n >= 0) return g(text);
+8: && to ||: if (!text || *n >= 0) return g(text);
+8: 0 to 1: if (!text && *n >= 1) return g(text);
+8: >= to >: if (!text && *n > 0) return g(text);
+8: return of {}: if (!text && *n >= 0) return {};
+10: call removed: ;
+11: < to <=: for (; *n <= 3; ++*n) break;
+11: break to continue: for (; *n < 3; ++*n) continue;
+11: n to n+1: for (; *n < 4; ++*n) break;
+12: 0 to 1: /* a < b */ return true ? std::min(a[1], 1'000) : n->size;
+12: ?: swapped: /* a < b */ return true ? n->size : std::min(a[0], 1'000);
+12: min to max: /* a < b */ return true ? std::max(a[0], 1'000) : n->size;
+12: n to n+1: /* a < b */ return true ? std::min(a[0], 1001) : n->size;
+12: true to false: /* a < b */ return false ? std::min(a[0], 1'000) : n->size;
+14: n to n+1: constexpr Row rows[] = {{3, "a"}, {"b", 4}};
 """
 
 
@@ -160,4 +161,5 @@ def self_test():
     """What the table does to the sample other than it should; empty when all is right."""
     found = {f"{m.lines()[0]}: {m.operator}: {m.lines()[2]}" for m in mutants_of("sample.cpp", SAMPLE)}
     right = set(CHANGED.splitlines())
-    return [f"unexpected: {line}" for line in sorted(found - right)] + [f"missing: {line}" for line in sorted(right - found)]
+    return [f"{kind}: {line}" for kind, lines in (("unexpected", found - right), ("missing", right - found))
+            for line in sorted(lines)]

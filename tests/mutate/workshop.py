@@ -33,7 +33,7 @@ class Processes:
         self.lock, self.running, self.stopped = threading.Lock(), set(), False
 
     def run(self, command, place, scratch, patience):
-        """Runs a command in a folder. Returns its exit status, None if it took too long, and the start of its output."""
+        """Runs a command in a folder. Returns its exit status, None if it took too long, and its first output."""
         with open(scratch / "output", "w+b") as output:
             with self.lock:
                 if self.stopped:
