@@ -12,6 +12,7 @@
 #include <unistd.h>
 
 #include "tarsel/words/failure.h"
+#include "tarsel/words/messages.h"
 
 namespace fs = std::filesystem;
 
@@ -59,7 +60,7 @@ void checkFolder(const fs::path& name) {
     } else if (status.type() == fs::file_type::none) {
         refuse(name, inLine(error.message()));
     } else {
-        refuse(name, "the folder " + quoted + " does not exist");
+        throw failure(Msg::outputFolderAbsent, {name.string(), folder.string()});
     }
 }
 
@@ -76,7 +77,7 @@ bool place(const fs::path& file, const fs::path& name, bool overwrite) {
     if (overwrite && rename(RENAME_EXCHANGE)) return true;
     if (!overwrite || errno == ENOENT) {
         if (rename(RENAME_NOREPLACE)) return false;
-        if (errno == EEXIST) refuse(name, "it exists; use -y to overwrite it");
+        if (errno == EEXIST) throw failure(Msg::outputExists, {name.string()});
     }
     // Some file systems know none of the two.
     if (errno == EINVAL && rename(0)) return false;
@@ -129,11 +130,11 @@ Outputs::~Outputs() { discard(); }
 
 void Outputs::checkFinal(const fs::path& name) const {
     for (const auto& input : inputs_)
-        if (sameFile(input, name)) refuse(name, "it is also an input");
+        if (sameFile(input, name)) throw failure(Msg::outputIsInput, {name.string()});
     std::error_code error;
     const auto status = fs::symlink_status(name, error);
     if (error && status.type() == fs::file_type::none) refuse(name, inLine(error.message()));
-    if (!overwrite_ && !device_ && fs::exists(status)) refuse(name, "it exists; use -y to overwrite it");
+    if (!overwrite_ && !device_ && fs::exists(status)) throw failure(Msg::outputExists, {name.string()});
     if (!device_ && fs::is_directory(name, error)) refuse(name, "a folder of this name is in the way");
 }
 
