@@ -85,7 +85,7 @@ int RawAviMux::describeVideo(const QvCodec& encoder, AviInterleaver::Source& sou
     if (!picture)
         return setError(QvStatus::failed,
                         "AVI holds no pictures of the type '%s' at %dx%d; it takes BGR3, BGR4, I420, YV12, "
-                        "YUYV, UYVY, v210 and Y216",
+                        "YUYV, UYVY and v210",
                         qvFourccText(type).data(), width, height);
     const Any rate = encoder.getParam("framerate");
     const QvRatio ratio = rate.isFramerate() ? rate.asFramerate().rate() : QvRatio(0, 1);
@@ -98,6 +98,7 @@ int RawAviMux::describeVideo(const QvCodec& encoder, AviInterleaver::Source& sou
     track.scale = static_cast<unsigned>(ratio.den);
     track.width = width;
     track.height = height;
+    track.interlaced = rate.asFramerate().interlaced();
     track.format = pictureFormat(*picture);
     source.picture = std::move(*picture);
     return QvStatus::ok;

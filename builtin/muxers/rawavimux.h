@@ -9,7 +9,7 @@
 // 2 TiB with the defaults; readers that know the first segment only still play that. A run that is aborted
 // leaves a file without index.
 //
-// Video types of the encoders: BGR3, BGR4 (BGRA), I420, YV12, YUYV (YUY2), UYVY, v210, Y216. Each stream has
+// Video types of the encoders: BGR3, BGR4 (BGRA), I420, YV12, YUYV (YUY2), UYVY, v210. Each stream has
 // its own size and rate. Sound is integer PCM; one that is neither of one or two channels with 8 or 16 bits
 // has the extensible format.
 //

@@ -4,6 +4,7 @@
 #include <array>
 #include <cerrno>
 #include <climits>
+#include <numeric>
 
 #include "builtin/muxers/rawavimuxbytes.h"
 #include "core/stream/qvbufstrm.h"
@@ -234,6 +235,7 @@ void AviFile::putStream(AviBytes& to, size_t number) const {
     const size_t format = to.open("strf");
     to.bytes(track.format);
     to.close(format);
+    if (track.video) putPictureShape(to, track);
     const size_t places = to.open("indx");
     to.u16(oldIndexEntry / 4).u16(indexOfIndexes << 8).u32(static_cast<int64_t>(track.index.size()));
     to.streamId(dataId[track.video], number).zeros(12);
@@ -241,4 +243,25 @@ void AviFile::putStream(AviBytes& to, size_t number) const {
     to.zeros((static_cast<size_t>(limits_.segments) - track.index.size()) * oldIndexEntry);
     to.close(places);
     to.close(list);
+}
+
+// Square pixels, and which lines belong to which field. Both lengths of the aspect have 16 bits.
+void AviFile::putPictureShape(AviBytes& to, const AviTrack& track) {
+    int across = track.width / std::gcd(track.width, track.height);
+    int down = track.height / std::gcd(track.width, track.height);
+    while (std::max(across, down) > UINT16_MAX) {
+        across = std::max(across / 2, 1);
+        down = std::max(down / 2, 1);
+    }
+    const int fields = track.interlaced == 0 ? 1 : 2;
+    const int64_t refresh = (int64_t{track.rate} * fields + track.scale / 2) / track.scale;
+    const size_t shape = to.open("vprp");
+    to.u32(0).u32(0).u32(refresh).u32(track.width).u32(track.height);
+    to.u16(down).u16(across).u32(track.width).u32(track.height).u32(fields);
+    for (int field = 0; field < fields; ++field) {
+        const bool upper = fields == 1 || (field == 0) == (track.interlaced == 1);
+        const int lines = fields == 1 ? track.height : (track.height + upper) / 2;
+        to.u32(lines).u32(track.width).u32(lines).u32(track.width).zeros(12).u32(upper ? 0 : 1);
+    }
+    to.close(shape);
 }

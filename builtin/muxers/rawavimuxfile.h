@@ -17,6 +17,7 @@ struct AviTrack {
     unsigned unitBytes = 0;  // of an audio sample of all channels; 0 for video
     int width = 0;
     int height = 0;
+    int interlaced = 0;                 // as QvFramerate counts it
     std::vector<unsigned char> format;  // contents of "strf"
 
     // Kept by the file.
@@ -76,6 +77,7 @@ class AviFile {
     int64_t indexBytes(size_t entries) const;
     std::vector<unsigned char> header() const;
     void putStream(class AviBytes& to, size_t number) const;
+    static void putPictureShape(class AviBytes& to, const AviTrack& track);
 
     QvBufStream* output_ = nullptr;
     std::vector<AviTrack> tracks_;

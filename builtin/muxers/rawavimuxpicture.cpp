@@ -8,7 +8,7 @@
 
 namespace {
 
-enum class Kind { rgb, packed, planar, planarVFirst, asItIs };
+enum class Kind { rgb, packed, planar, asItIs };
 
 struct Type {
     unsigned fourcc;
@@ -22,12 +22,11 @@ constexpr Type types[] = {
     {QvFourcc::BGR4, 0, 32, Kind::rgb},
     {QvFourcc::BGRA, 0, 32, Kind::rgb},
     {QvFourcc::I420, QvFourcc::I420, 12, Kind::planar},
-    {QvFourcc::YV12, QvFourcc::YV12, 12, Kind::planarVFirst},
+    {QvFourcc::YV12, QvFourcc::YV12, 12, Kind::planar},
     {QvFourcc::YUYV, QvFourcc::YUY2, 16, Kind::packed},
     {QvFourcc::YUY2, QvFourcc::YUY2, 16, Kind::packed},
     {QvFourcc::UYVY, QvFourcc::UYVY, 16, Kind::packed},
     {QvFourcc::v210, QvFourcc::v210, 20, Kind::asItIs},
-    {QvFourcc::Y216, QvFourcc::Y216, 32, Kind::asItIs},
 };
 
 constexpr size_t bandBytes = 256 * 1024;  // stays in the cache
@@ -72,14 +71,11 @@ std::optional<AviPicture> AviPicture::of(unsigned fourcc, int width, int height)
         picture.planes_.push_back(
             {from, chroma, (columns + 1) / 2, chroma, height / 2, (height + 1) / 2, 1, false});
     };
-    const auto u = positive(shape.plane_bytes(0));
-    const auto v = u + positive(shape.plane_bytes(1));
+    const auto second = positive(shape.plane_bytes(0));
+    const auto third = second + positive(shape.plane_bytes(1));
     if (type->kind == Kind::planar) {
-        addChroma(1, u);
-        addChroma(2, v);
-    } else if (type->kind == Kind::planarVFirst) {
-        addChroma(2, v);
-        addChroma(1, u);
+        addChroma(1, second);
+        addChroma(2, third);
     }
     for (const auto& plane : picture.planes_) picture.fileBytes_ += plane.toStride * positive(plane.toRows);
     return picture;

@@ -11,9 +11,12 @@
 //
 //     BGR3, BGR4, BGRA        bottom-up, rows padded with zeros to 4 bytes
 //     YUY2, YUYV, UYVY        top-down; of an odd width the last pair of pixels is completed
-//     I420, YV12              top-down, rows without padding; YV12 has V before U; the chroma of an odd width
-//                             or height is rounded up, by repeating the last column or row
-//     v210, Y216              top-down, as they come
+//     I420, YV12              top-down, rows without padding; chroma planes as in the frame, of YV12 V before
+//                             U; the chroma of an odd width or height is rounded up, by repeating the last
+//                             column or row
+//     v210                    top-down, as they come
+//
+// Y216 is none of them: readers take files of that tag for samples of 14 bits.
 class AviPicture {
   public:
     using Put = std::function<bool(const unsigned char* data, size_t bytes)>;

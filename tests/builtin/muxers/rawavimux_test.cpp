@@ -19,7 +19,7 @@ class AviReader {
         bool operator==(const Chunk&) const = default;
     };
     struct Stream {
-        std::string header, format = {};
+        std::string header, format = {}, shape = {};
         std::vector<Chunk> chunks = {};    // by the super index
         std::vector<unsigned> units = {};  // that each of its places covers
     };
@@ -82,6 +82,8 @@ class AviReader {
             streams.push_back({data(c)});
         } else if (c.id == "strf") {
             streams.back().format = data(c);
+        } else if (c.id == "vprp") {
+            streams.back().shape = data(c);
         } else if (c.id == "indx") {
             super_.push_back(c);
         } else if (c.id == "dmlh") {
@@ -141,9 +143,8 @@ TEST_F(RawAvi, PicturesOfEachType) {
         {QvFourcc::BGR3, "DIB ", 0, 24, 3, 2, "mnopqrstu\0\0\0abcdefghi\0\0\0"s},
         {QvFourcc::BGR4, "DIB ", 0, 32, 2, 2, "ijklmnopabcdefgh"},
         {QvFourcc::I420, "I420", QvFourcc::I420, 12, 3, 3, "abcdefghiAAAA0000"},
-        {QvFourcc::YV12, "YV12", QvFourcc::YV12, 12, 4, 2, "abcdefgh01AB"},
+        {QvFourcc::YV12, "YV12", QvFourcc::YV12, 12, 4, 2, "abcdefghAB01"},
         {QvFourcc::YUYV, "YUY2", QvFourcc::YUY2, 16, 3, 2, "abcdefcdghijklij"},
-        {QvFourcc::Y216, "Y216", QvFourcc::Y216, 32, 2, 2, "abcdefghijklmnop"},
     };
     for (const auto& row : rows) {
         SCOPED_TRACE(testing::Message() << row.handler << row.bits << " " << row.width);
@@ -166,6 +167,35 @@ TEST_F(RawAvi, PicturesOfEachType) {
                                                leBytes(unsigned(row.bits), 2) + leBytes(row.compression, 4) +
                                                leBytes(row.expected.size(), 4) + std::string(16, '\0'));
         EXPECT_EQ(leNumber(stream.header, 36, 4), row.expected.size());
+    }
+}
+
+// The shape of the picture, of which the pixels are square, and the lines of its fields in order of time.
+TEST_F(RawAvi, ShapeAndFields) {
+    const auto words = [](std::initializer_list<unsigned> values) {
+        std::string bytes;
+        for (const unsigned value : values) bytes += leBytes(value, 4);
+        return bytes;
+    };
+    const unsigned aspect = 64 << 16 | 35;  // 64:35
+    const struct {
+        int interlaced;
+        unsigned refresh, fields;
+        std::string lines;
+    } rows[] = {
+        {0, 25, 1, words({35, 64, 35, 64, 0, 0, 0, 0})},
+        {1, 50, 2, words({18, 64, 18, 64, 0, 0, 0, 0, 17, 64, 17, 64, 0, 0, 0, 1})},
+        {2, 50, 2, words({17, 64, 17, 64, 0, 0, 0, 1, 18, 64, 18, 64, 0, 0, 0, 0})},
+    };
+    for (const auto& row : rows) {
+        pipe_->clearStreams();
+        addVideo(QvFourcc::YUYV, 64, 35, QvFramerate(QvRatio(25, 1), row.interlaced));
+        ASSERT_EQ(pipe_->open(), 0) << pipe_->errorDesc();
+        writePicture(0);
+        ASSERT_EQ(pipe_->close(), 0);
+        EXPECT_EQ(readAvi().streams.at(0).shape,
+                  words({0, 0, row.refresh, 64, 35, aspect, 64, 35, row.fields}) + row.lines)
+            << row.interlaced;
     }
 }
 
@@ -244,10 +274,12 @@ TEST_F(RawAvi, SoundFormats) {
 }
 
 TEST_F(RawAvi, WhatItCanNotHold) {
-    addVideo(QvFourcc::GRAY, 32, 32);
-    EXPECT_EQ(pipe_->open(), QvStatus::failed);
-    EXPECT_NE(std::strstr(pipe_->errorDesc(), "GRAY"), nullptr);
-    pipe_->clearStreams();
+    for (const auto& [type, name] : {std::pair{QvFourcc::GRAY, "GRAY"}, {QvFourcc::Y216, "Y216"}}) {
+        addVideo(type, 32, 32);
+        EXPECT_EQ(pipe_->open(), QvStatus::failed);
+        EXPECT_NE(std::strstr(pipe_->errorDesc(), name), nullptr);
+        pipe_->clearStreams();
+    }
     pipe_->getMuxer()->setParam("segments", 3);
     pipe_->getMuxer()->setParam("riffBytes", 20000);
     addVideo(QvFourcc::BGR4, 64, 64);
