@@ -1,44 +1,11 @@
 #include "core/caption/cc/cctext.h"
 
-#include <array>
 #include <string_view>
 
+#include "core/caption/cc/cccharacters_p.h"
 #include "core/caption/cc/qvcc.h"
 
 namespace {
-
-using Characters16 = std::array<std::string_view, 16>;
-using Characters32 = std::array<std::string_view, 32>;
-
-// 0x11 or 0x19, then 0x30 to 0x3F.
-constexpr Characters16 specialCharacters = {"®", "°", "½", "¿", "™", "¢", "£", "♪",
-                                            "à", " ", "è", "â", "ê", "î", "ô", "û"};
-// 0x12 or 0x1A, then 0x20 to 0x3F: Spanish, miscellaneous, French.
-constexpr Characters32 westCharacters = {"Á", "É", "Ó", "Ú", "Ü", "ü", "‘", "¡", "*", "'", "—",
-                                         "©", "℠", "•", "“", "”", "À", "Â", "Ç", "È", "Ê", "Ë",
-                                         "ë", "Î", "Ï", "ï", "Ô", "Ù", "ù", "Û", "«", "»"};
-// 0x13 or 0x1B, then 0x20 to 0x3F: Portuguese, German, Danish. The pipe of 0x2E is broken, as "|" parts rows.
-constexpr Characters32 northCharacters = {"Ã",  "ã", "Í", "Ì", "ì", "Ò", "ò", "Õ", "õ", "{", "}",
-                                          "\\", "^", "_", "¦", "~", "Ä", "ä", "Ö", "ö", "ß", "¥",
-                                          "¤",  "│", "Å", "å", "Ø", "ø", "┌", "┐", "└", "┘"};
-
-// Where the basic set is not ASCII.
-std::string basicCharacter(int code) {
-    switch (code) {
-        case 0x27: return "’";
-        case 0x2A: return "á";
-        case 0x5C: return "é";
-        case 0x5E: return "í";
-        case 0x5F: return "ó";
-        case 0x60: return "ú";
-        case 0x7B: return "ç";
-        case 0x7C: return "÷";
-        case 0x7D: return "Ñ";
-        case 0x7E: return "ñ";
-        case 0x7F: return "█";
-        default: return std::string(1, static_cast<char>(code));
-    }
-}
 
 class Reader {
   public:
@@ -54,7 +21,7 @@ class Reader {
             inService_ = first != 0x0F;
         } else if (!inService_) {
             for (const int code : {first, second})
-                if (code >= 0x20) row_ += basicCharacter(code);
+                if (code >= 0x20) row_ += qvCcBasicCharacter(code);
         }
     }
 
@@ -71,17 +38,14 @@ class Reader {
         lastControl_ = again ? 0 : control;  // sent twice, meant once
         if (again) return;
         const int code = first & 0x17;  // without the channel
-        const auto index = static_cast<std::size_t>(second & 0x1F);
         if (second >= 0x40)
             endRow();  // an address
         else if (code == 0x11 && second >= 0x30)
-            row_ += specialCharacters[index & 0xF];
+            row_ += qvCcSpecialCharacter(second);
         else if (code == 0x11 && second >= 0x20)
             separate();  // a change of style takes a column
-        else if (code == 0x12 && second >= 0x20)
-            replaceLast(westCharacters[index]);
-        else if (code == 0x13 && second >= 0x20)
-            replaceLast(northCharacters[index]);
+        else if ((code == 0x12 || code == 0x13) && second >= 0x20)
+            replaceLast(qvCcExtendedCharacter(code, second));
         else if (code == 0x17 && second >= 0x21 && second <= 0x23)
             separate();  // a tab
         else if ((code == 0x14 || code == 0x15) && second == 0x21)
