@@ -30,6 +30,13 @@ std::string wordText(const QvCcBytePair& pair, bool fourDigits) {
     return text;
 }
 
+void reportDamage(const SccFile& scc, const char* name) {
+    for (const auto& [line, what] : scc.damage)
+        qv_log()->warning("%s, line %d: %s", name, line, what.c_str());
+    if (const int more = scc.damaged - static_cast<int>(scc.damage.size()); more > 0)
+        qv_log()->warning("%s has %d more such places", name, more);
+}
+
 int saveText(const Any& filename, const std::string& text) {
     const Any name = filename.toString();
     auto* file = static_cast<std::FILE*>(QvFile::fopen(filename, "wb"));
@@ -50,6 +57,7 @@ int QvCcData::readScc(const Any& filename, int type, bool detect, QvFramerate& r
     QV_ASSERT(type == QvCcBytePair::field1 || type == QvCcBytePair::field2);
     SccFile scc;
     if (scc.read(filename, dropFrameLines) != QvStatus::ok) return QvStatus::noSegment;
+    if (dropFrameLines) reportDamage(scc, filename.toString().asString(""));
     const QvFramerate likely = scc.likelyRate(detect);
     if (detect)
         rate = likely;

@@ -139,8 +139,10 @@ class QV_API QvCcData {
     //   detect          true: `rate` becomes what the highest frame number suggests. False: it is taken as it
     //                   is, with a warning if it seems wrong
     //   dropFrame       null, or what takes the place of the rate's df
-    //   dropFrameLines  lines with ";" before the frames are read as well, and the rate found is then drop
-    //                   frame; otherwise they are passed over
+    //   dropFrameLines  for files as they are found: lines with ";" before the frames are read as well, and
+    //   the
+    //                   rate found is then drop frame; carriage returns end lines; a UTF-8 mark may stand at
+    //                   the start; words that are damaged are named in warnings, with their lines
     int readScc(const Any& filename, int type, bool detect, QvFramerate& rate, const bool* dropFrame,
                 bool dropFrameLines = false);
     // Writes all pairs, whatever their type, a run of equal times as one line. 0; -1 for a file that can't be

@@ -16,9 +16,11 @@
 namespace {
 
 constexpr std::string_view signature = "Scenarist_SCC";
+constexpr std::string_view mark = "\xEF\xBB\xBF";
 constexpr std::size_t longestLine = 8192;  // what is behind it counts as a line of its own
 constexpr std::size_t blockSize = 64 * 1024;
 constexpr std::size_t wordDigits = 4;
+constexpr std::size_t longestShown = 20;  // of a damaged word
 constexpr std::size_t shortestTimecode = 7, longestTimecode = 11;
 constexpr int timecodeParts = 4;
 constexpr long largestFrameField = 60;
@@ -26,19 +28,23 @@ constexpr long largestHour = 9900;  // the frames of more go beyond an int
 
 class LineReader {
   public:
-    explicit LineReader(std::FILE* file) : file_(file), block_(new char[blockSize]) {}
+    // `returns`: a carriage return ends a line, too, and a UTF-8 mark is no part of the first one.
+    LineReader(std::FILE* file, bool returns) : file_(file), block_(new char[blockSize]), returns_(returns) {
+        refill();
+        if (returns && std::string_view(block_.get(), end_).starts_with(mark)) begin_ = mark.size();
+    }
 
-    // The next line without its line feed, valid until the next call.
+    // The next line without its end, valid until the next call.
     bool next(std::string_view& line) {
         if (end_ - begin_ <= longestLine) refill();
         if (begin_ == end_) return false;
-        const char* start = block_.get() + begin_;
-        const std::size_t most = std::min(end_ - begin_, longestLine);
-        const void* feed = std::memchr(start, '\n', most);
-        const std::size_t length =
-            feed ? static_cast<std::size_t>(static_cast<const char*>(feed) - start) : most;
-        line = {start, length};
-        begin_ += length + (feed ? 1 : 0);
+        const std::string_view rest(block_.get() + begin_, std::min(end_ - begin_, longestLine));
+        std::size_t end = std::min(rest.find('\n'), rest.size());
+        if (returns_) end = std::min(rest.substr(0, end).find('\r'), end);
+        // Of both, as Windows writes them, the second ends no line of its own.
+        const bool pair = rest.substr(end).starts_with("\r\n");
+        line = rest.substr(0, end);
+        begin_ += end + (pair ? 2 : end < rest.size() ? 1 : 0);
         return true;
     }
     bool failed() const { return std::ferror(file_) != 0; }
@@ -56,6 +62,7 @@ class LineReader {
 
     std::FILE* file_;
     std::unique_ptr<char[]> block_;
+    bool returns_;
     std::size_t begin_ = 0, end_ = 0;
     bool atEnd_ = false;
 };
@@ -116,14 +123,33 @@ std::uint16_t readWord(std::string_view token) {
     return static_cast<std::uint16_t>(value);
 }
 
-void readLine(std::string_view line, bool dropFrameLines, SccFile& scc) {
+bool isWord(std::string_view token) {
+    return token.size() == wordDigits && std::all_of(token.begin(), token.end(), [](char c) {
+               return hexDigits[static_cast<unsigned char>(c)] >= 0;
+           });
+}
+
+void report(SccFile& scc, int number, const std::string& what) {
+    if (++scc.damaged <= SccFile::mostReported) scc.damage.emplace_back(number, what);
+}
+
+void readLine(std::string_view line, int number, bool dropFrameLines, SccFile& scc) {
     SccLine kept{};
     std::string_view token;
+    int tokens = 0;
     do {
         token = nextToken(line);
-        if (token.empty()) return;
+        if (token.empty()) {
+            if (tokens > 0) report(scc, number, "there is no timecode HH:MM:SS:FF");
+            return;
+        }
+        ++tokens;
     } while (!readTimecode(token, dropFrameLines, kept.timecode));
     while (!(token = nextToken(line)).empty()) {
+        if (!isWord(token))
+            report(
+                scc, number,
+                "'" + std::string(token.substr(0, longestShown)) + "' is no word of four hexadecimal digits");
         if (token.size() != wordDigits) continue;
         scc.words.push_back(readWord(token));
         ++kept.words;
@@ -147,15 +173,15 @@ int SccFile::read(const Any& filename, bool dropFrameLines) {
     };
     if (!file) return refuse();
 
-    LineReader reader(file.get());
+    LineReader reader(file.get(), dropFrameLines);
     std::string_view line;
     const bool known = reader.next(line) && line.starts_with(signature);
     if (reader.failed()) return refuse();
     if (!known) return QvStatus::noSegment;
     bool tooLong = false;
-    while (reader.next(line)) {
+    for (int number = 2; reader.next(line); ++number) {
         tooLong |= line.size() == longestLine;
-        readLine(line, dropFrameLines, *this);
+        readLine(line, number, dropFrameLines, *this);
     }
     if (reader.failed()) return refuse();
     if (tooLong)

@@ -2,6 +2,8 @@
 #pragma once
 
 #include <cstdint>
+#include <string>
+#include <utility>
 #include <vector>
 
 #include "core/measure/qvframerate.h"
@@ -20,7 +22,13 @@ struct SccFile {
     int highestFrame = 0;              // of the timecodes
     bool dropFrame = false;            // a line has ";" before the frames
 
-    // Lines with ";" count with `dropFrameLines`. 0; -1: can't be opened or read; -15: no SCC file.
+    // What was passed over or is no hexadecimal number: the line, from 1, and a sentence. The first ones.
+    static constexpr int mostReported = 5;
+    std::vector<std::pair<int, std::string>> damage;
+    int damaged = 0;  // all of them
+
+    // With `dropFrameLines` lines with ";" count, carriage returns end lines, and a UTF-8 mark may stand at
+    // the start. 0; -1: can't be opened or read; -15: no SCC file.
     int read(const Any& filename, bool dropFrameLines);
     // What the highest frame number suggests; with `warn` the log says so if that is a guess.
     QvFramerate likelyRate(bool warn) const;

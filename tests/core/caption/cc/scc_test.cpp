@@ -57,6 +57,30 @@ TEST_F(Scc, KeepsLinesWithATimecodeAndWords) {
     EXPECT_EQ(data.count(), 0);
 }
 
+TEST_F(Scc, FilesAsTheyAreFound) {
+    const std::string mark = "\xEF\xBB\xBF", head = "Scenarist_SCC V1.0";
+    const std::string macintosh = head + "\r\r00:00:01;02\t9420 942f\r\r00:00:02;02\t94ae\r";
+    ASSERT_EQ(readFile(folder.write("a.scc", macintosh)), 0);
+    EXPECT_EQ(words(), "");
+    ASSERT_EQ(readFile(folder.write("a.scc", mark + macintosh), true), 0);
+    EXPECT_EQ(words(), "9420 942f 94ae");
+    EXPECT_FALSE(log.contains("line"));
+    EXPECT_EQ(readFile(folder.write("a.scc", mark + head)), -15);
+
+    const std::string damaged =
+        head + "\r\n\r\n00:00:01:02\t9420 94x0 942f\r\n\r\n00:00:0s 9420\r\n1:2:3:4 94208";
+    ASSERT_EQ(readFile(folder.write("a.scc", damaged)), 0);
+    EXPECT_FALSE(log.contains("line"));
+    ASSERT_EQ(readFile(folder.write("a.scc", damaged), true), 0);
+    EXPECT_TRUE(log.contains("a.scc, line 3: '94x0' is no word of four hexadecimal digits"));
+    EXPECT_TRUE(log.contains("a.scc, line 5: there is no timecode HH:MM:SS:FF"));
+    EXPECT_TRUE(log.contains("a.scc, line 6: '94208' is no word of four hexadecimal digits"));
+    std::string bad;
+    for (int i = 0; i < 9; ++i) bad += "\nno";
+    ASSERT_EQ(readFile(folder.write("a.scc", head + bad), true), 0);
+    EXPECT_TRUE(log.contains("has 4 more such places"));
+}
+
 TEST_F(Scc, GuessesTheRateFromTheHighestFrame) {
     QvFramerate drop29 = QvFramerate::f29p(), drop59 = QvFramerate::f59p();
     drop29.setDf(true);
