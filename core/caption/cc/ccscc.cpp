@@ -81,7 +81,7 @@ int QvCcData::readScc(const Any& filename, int type, bool detect, QvFramerate& r
     return QvStatus::ok;
 }
 
-int QvCcData::writeScc(const Any& filename, const QvFramerate& rate, const QvSccWriting& options) const {
+std::string QvCcData::sccText(const QvFramerate& rate, const QvSccWriting& options) const {
     std::string text = "Scenarist_SCC V1.0\n\n";
     for (auto pair = pairs_.begin(); pair != pairs_.end();) {
         auto end = std::find_if(pair, pairs_.end(), [&](const auto& p) { return !(p.time == pair->time); });
@@ -94,6 +94,9 @@ int QvCcData::writeScc(const Any& filename, const QvFramerate& rate, const QvScc
             text += separator + wordText(*pair, options.complete);
         text += "\n\n";
     }
-    text += "\n";
-    return saveText(filename, text);
+    return text += "\n";
+}
+
+int QvCcData::writeScc(const Any& filename, const QvFramerate& rate, const QvSccWriting& options) const {
+    return saveText(filename, sccText(rate, options));
 }
