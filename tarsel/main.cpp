@@ -62,6 +62,7 @@ int run(int argc, char** argv) {
     addModules(line);
     addFormats(line);
     addPresets(line);
+    addRecover(line);
     const CommandLine::Parsed parsed = line.parse(argc, argv);
     if (!parsed.action) {
         printText(parsed.text);

@@ -10,4 +10,5 @@ void addCaptions(CommandLine& line);
 void addModules(CommandLine& line);
 void addFormats(CommandLine& line);
 void addPresets(CommandLine& line);
+void addRecover(CommandLine& line);
 void addFrame(CommandLine& line, Signals& signals);

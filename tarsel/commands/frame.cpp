@@ -4,6 +4,7 @@
 #include <cstdio>
 
 #include "tarsel/commands/commands.h"
+#include "tarsel/commands/outputoptions.h"
 #include "tarsel/host/outputs.h"
 #include "tarsel/host/signals.h"
 #include "tarsel/picture/picturereader.h"
@@ -22,7 +23,7 @@ constexpr int kGap = 8;            // pixels between its pictures
 struct Given {
     std::string input, raw, at, output, sheet;
     EffectOptions effects;
-    bool overwrite = false;
+    OutputOptions outputOptions;
     std::shared_ptr<Outputs> outputs;
     Signals* signals = nullptr;
 };
@@ -90,16 +91,17 @@ void saveSheet(PictureReader& reader, const Given& given) {
 
 void frame(Given& given) {
     given.effects.check();
+    const OutputPolicy policy = given.outputOptions.policy();
     const Any extension = QvFile::getExt(Any(given.output.c_str()), true);
     if (!(extension == "png"))
         throw Failure(Exit::usage, "-o " + inQuotes(given.output) + ": a picture is a .png file");
     Source source(given.input, given.raw);
-    given.outputs = std::make_shared<Outputs>(given.output, "-o", std::vector{given.input}, given.overwrite);
+    given.outputs = std::make_shared<Outputs>(given.output, "-o", std::vector{given.input}, policy);
     if (source.decoder().nrStreams(1) == 0)
         throw Failure(Exit::input, inQuotes(given.input) + " has no picture");
     source.selectAll();
     PictureReader reader(source, given.effects);
-    if (reader.pipe()) checkFilterFiles(*reader.pipe(), {given.input}, given.outputs.get(), given.overwrite);
+    if (reader.pipe()) checkFilterFiles(*reader.pipe(), {given.input}, given.outputs.get(), policy);
     if (!given.sheet.empty()) return saveSheet(reader, given);
     const auto rate = source.frameRate();
     const MediaTime at = given.at.empty() ? MediaTime(0LL, kTicks) : parseTime(given.at, rate, "--at");
@@ -122,6 +124,6 @@ void addFrame(CommandLine& line, Signals& signals) {
     command.option("--raw", given->raw, "Format of a raw file: size=WxH,pixel=FORMAT,rate=R", "K=V,...");
     command.option("-o,--output", given->output, "The picture", "FILE.png", Need::required);
     addEffectOptions(command, given->effects);
-    command.flag("-y,--overwrite", given->overwrite, "Overwrite an existing picture");
+    given->outputOptions.add(command);
     command.action([given] { frame(*given); });
 }

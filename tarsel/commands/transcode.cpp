@@ -1,4 +1,5 @@
 #include "tarsel/commands/commands.h"
+#include "tarsel/commands/outputoptions.h"
 #include "tarsel/host/signals.h"
 #include "tarsel/job/job.h"
 #include "tarsel/words/commandline.h"
@@ -9,12 +10,16 @@ namespace {
 // Options as they were given; they are parsed once the command runs.
 struct Given {
     JobOptions job;
+    OutputOptions outputs;
     std::string samplerate, channels, bits, progress = "auto";
 };
 
 void resolve(Given& given) {
     JobOptions& job = given.job;
     job.effects.check();
+    job.policy = given.outputs.policy();
+    job.policy.recover = !job.dryRun;
+    job.policy.quiet = job.quiet;
     if (!given.samplerate.empty())
         job.samplerate = static_cast<int>(parseNumber(given.samplerate, 1000, 768000, "--samplerate"));
     if (!given.channels.empty())
@@ -62,7 +67,7 @@ void addTranscode(CommandLine& line, Signals& signals) {
     command.flag("--split-channels", job.splitChannels, "One WAV file a channel");
     command.flag("--accept-partial", job.acceptPartial, "Take what is there of a damaged input");
     command.flag("--dry-run", job.dryRun, "Print the plan and do nothing");
-    command.flag("-y,--overwrite", job.overwrite, "Overwrite existing outputs");
+    given->outputs.add(command);
     command.flag("-q,--quiet", job.quiet, "Say nothing but errors");
     addEffectOptions(command, job.effects);
     command.action([&signals, given] { transcode(*given, signals); });

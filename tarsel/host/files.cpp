@@ -28,6 +28,17 @@ std::string whyNoInput(const std::string& name) {
     return "";
 }
 
+std::string whyNoFolder(const std::string& name) {
+    std::error_code error;
+    const auto status = fs::status(name, error);
+    if (!fs::exists(status))
+        return error && error != std::errc::no_such_file_or_directory ? inLine(error.message())
+                                                                      : "no such folder";
+    if (!fs::is_directory(status)) return "this is no folder";
+    const fs::directory_iterator entries(name, error);
+    return error ? inLine(error.message()) : "";
+}
+
 bool exists(const std::string& name) {
     std::error_code error;
     return fs::exists(name, error);

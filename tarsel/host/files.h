@@ -9,6 +9,9 @@ std::string whyNoFile(const std::string& name);
 // The same; then also "the file is empty", and why the file does not open.
 std::string whyNoInput(const std::string& name);
 
+// Why `name` is no folder whose entries can be read, in the same words; "" if it is one.
+std::string whyNoFolder(const std::string& name);
+
 bool exists(const std::string& name);
 bool isRegularFile(const std::string& name);
 // Neither a regular file nor a folder, as "/dev/null" is.

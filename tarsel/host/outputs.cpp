@@ -1,16 +1,16 @@
 #include "tarsel/host/outputs.h"
 
 #include <algorithm>
-#include <atomic>
 #include <cerrno>
 #include <cstdio>
 #include <cstring>
+#include <set>
 
-#include <dirent.h>
-#include <fcntl.h>
-#include <stdlib.h>
 #include <unistd.h>
 
+#include "tarsel/host/attributes.h"
+#include "tarsel/host/foldercalls.h"
+#include "tarsel/host/recovery.h"
 #include "tarsel/words/failure.h"
 #include "tarsel/words/messages.h"
 
@@ -64,40 +64,32 @@ void checkFolder(const fs::path& name) {
     }
 }
 
-struct Placed {
-    fs::path hidden, final;
-    bool exchanged;  // what stood there before has the hidden name
-};
-
-// In one step, so that there is never a moment without either file.
-bool place(const fs::path& file, const fs::path& name, bool overwrite) {
-    const auto rename = [&](unsigned flags) {
-        return renameat2(AT_FDCWD, file.c_str(), AT_FDCWD, name.c_str(), flags) == 0;
-    };
-    if (overwrite && rename(RENAME_EXCHANGE)) return true;
-    if (!overwrite || errno == ENOENT) {
-        if (rename(RENAME_NOREPLACE)) return false;
-        if (errno == EEXIST) throw failure(Msg::outputExists, {name.string()});
+// Where the links lead to that `name` is, also if nothing is there yet.
+fs::path followed(fs::path name) {
+    constexpr int most = 40;  // as the system follows
+    std::error_code error;
+    for (int i = 0; i < most && fs::is_symlink(fs::symlink_status(name, error)); ++i) {
+        const fs::path to = fs::read_symlink(name, error);
+        if (error) break;
+        name = to.is_absolute() ? to : folderOf(name) / to;
     }
-    // Some file systems know none of the two.
-    if (errno == EINVAL && rename(0)) return false;
-    refuse(name, inLine(std::strerror(errno)));
+    return name;
 }
 
-// What the folder holds, which are plain files and links.
-void removeAll(int folder) {
-    alignas(dirent64) char entries[4096];
-    lseek(folder, 0, SEEK_SET);
-    for (ssize_t size; (size = getdents64(folder, entries, sizeof entries)) > 0;)
-        for (ssize_t at = 0; at < size;) {
-            const auto* entry = reinterpret_cast<const dirent64*>(entries + at);
-            unlinkat(folder, entry->d_name, 0);  // fails for "." and ".."
-            at += entry->d_reclen;
-        }
+// What follows the stem of a name, "#7.png" as "##.png": numbers make no other set.
+std::string shapeOf(std::string_view name) {
+    std::string shape;
+    for (size_t i = 0; i < name.size(); ++i) {
+        shape += name[i];
+        if (name[i] != '#' || i + 1 >= name.size() || name[i + 1] < '0' || name[i + 1] > '9') continue;
+        shape += '#';
+        while (i + 1 < name.size() && name[i + 1] >= '0' && name[i + 1] <= '9') ++i;
+    }
+    return shape;
 }
 
-// Those with a hidden folder; a job and its task file.
-std::atomic<Outputs*> g_live[4];
+// Those with a hidden folder: a job, its task file, and what its filters write.
+std::atomic<Outputs*> g_live[16];
 
 void replaceLive(Outputs* former, Outputs* now) {
     for (auto& live : g_live) {
@@ -106,24 +98,34 @@ void replaceLive(Outputs* former, Outputs* now) {
     }
 }
 
-void takeBack(const Placed& placed) {
-    renameat2(AT_FDCWD, placed.final.c_str(), AT_FDCWD, placed.hidden.c_str(),
-              placed.exchanged ? RENAME_EXCHANGE : 0);
-}
-
 }  // namespace
 
 Outputs::Outputs(const std::string& output, const std::string& option, const std::vector<std::string>& inputs,
-                 bool overwrite)
-    : output_(output), inputs_(inputs), overwrite_(overwrite), device_(takesStream(output)) {
+                 const OutputPolicy& policy)
+    : output_(output), inputs_(inputs), policy_(policy), device_(takesStream(output)) {
     std::error_code error;
     if (output.empty()) throw Failure(Exit::usage, option + ": the name of the output is empty");
     // The engine takes both slashes for separators.
     if (folderOf(output_).string().find('\\') != std::string::npos)
         refuse(output_, "a backslash can't stand in the name of the folder");
     if (fs::is_directory(output_, error)) refuse(output_, "this is a folder; give a file name in it");
-    if (!device_) checkFolder(output_);
+    if (!device_) {
+        target_ = followed(output_);
+        checkFolder(output_);
+        putInOrder(folderOf(output_));
+    }
     checkFinal(output_);
+    if (device_ || target_ == output_) return;
+    checkFolder(target_);
+    if (folderOf(target_) != folderOf(output_)) putInOrder(folderOf(target_));
+}
+
+void Outputs::putInOrder(const fs::path& folder) const {
+    if (!policy_.recover) return;
+    const auto found = recoverPlace(folder.string(), {.stale = policy_.stale, .sync = policy_.sync});
+    if (policy_.quiet) return;
+    for (const auto& line : recoveryLines(folder.string(), found, true))
+        std::fprintf(stderr, "tarsel: %s\n", line.c_str());
 }
 
 Outputs::~Outputs() { discard(); }
@@ -134,7 +136,8 @@ void Outputs::checkFinal(const fs::path& name) const {
     std::error_code error;
     const auto status = fs::symlink_status(name, error);
     if (error && status.type() == fs::file_type::none) refuse(name, inLine(error.message()));
-    if (!overwrite_ && !device_ && fs::exists(status)) throw failure(Msg::outputExists, {name.string()});
+    if (!policy_.overwrite && !device_ && fs::exists(status))
+        throw failure(Msg::outputExists, {name.string()});
     if (!device_ && fs::is_directory(name, error)) refuse(name, "a folder of this name is in the way");
 }
 
@@ -150,9 +153,9 @@ void Outputs::checkNumbered(const std::string& extension) const {
 }
 
 std::string Outputs::withFinalNames(std::string text) const {
-    const std::string hidden = (fs::path(folder_) / kBase).string();
+    const std::string hidden = (fs::path(work_.path()) / kBase).string();
     const std::string shown = (output_.parent_path() / output_.stem()).string();
-    for (size_t at = 0; !folder_.empty() && (at = text.find(hidden, at)) != std::string::npos;
+    for (size_t at = 0; !work_.path().empty() && (at = text.find(hidden, at)) != std::string::npos;
          at += shown.size())
         text.replace(at, hidden.size(), shown);
     return text;
@@ -164,22 +167,15 @@ std::string Outputs::hiddenName(const std::string& extension) const {
 
 std::string Outputs::begin(const std::string& extension) {
     // What is written to a device or a pipe goes straight there, by a link in a folder elsewhere.
-    const fs::path where = device_ ? fs::temp_directory_path() : folderOf(output_);
-    std::string pattern = (where / ".tarsel-XXXXXX").string();
-    folder_ = std::move(pattern);
+    const fs::path where = device_ ? fs::temp_directory_path() : folderOf(set_ ? output_ : target_);
+    if (device_) putInOrder(where);
     {
         std::lock_guard guard(lock_);
-        if (!mkdtemp(folder_.data())) refuse(output_, inLine(std::strerror(errno)));
-        folderHandle_ = open(folder_.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
-        if (folderHandle_ >= 0) replaceLive(nullptr, this);
+        if (const int error = work_.make(where.string())) refuse(output_, inLine(std::strerror(error)));
+        replaceLive(nullptr, this);
     }
-    if (folderHandle_ < 0) {
-        const int error = errno;
-        rmdir(folder_.c_str());
-        refuse(output_, inLine(std::strerror(error)));
-    }
-    fs::path name = fs::path(folder_) / kBase;
-    name += "." + extension;
+    fs::path name = fs::path(work_.path()) / kBase;
+    if (!extension.empty()) name += "." + extension;
     if (device_) {
         std::error_code error;
         fs::create_symlink(fs::absolute(output_), name, error);
@@ -197,15 +193,105 @@ std::string Outputs::finalName(const fs::path& written, const std::string& from)
 
 std::vector<fs::path> Outputs::written() const {
     std::vector<fs::path> files;
-    if (device_ || folder_.empty()) return files;
-    // The forms that report by a code end the program when memory is short.
-    try {
-        for (const auto& entry : fs::directory_iterator(folder_)) files.push_back(entry.path());
-    } catch (const fs::filesystem_error& failure) {
-        refuse(output_, inLine(failure.code().message()));
-    }
+    if (device_ || !work_) return files;
+    std::vector<std::string> names;
+    if (const int error = listFolder(work_.handle(), names)) refuse(output_, inLine(std::strerror(error)));
+    for (const auto& name : names)
+        if (name.rfind(kBase, 0) == 0) files.push_back(fs::path(work_.path()) / name);
     std::sort(files.begin(), files.end());
     return files;
+}
+
+bool Outputs::mayGo(const fs::path& name) const {
+    std::error_code error;
+    return !fs::is_directory(fs::symlink_status(name, error)) &&
+           std::none_of(inputs_.begin(), inputs_.end(),
+                        [&](const auto& input) { return sameFile(input, name); });
+}
+
+// What an earlier run of the same output has left: files whose names differ in nothing but their numbers,
+// and next to numbered pictures their sound.
+std::vector<std::string> Outputs::formerSet(const std::vector<Manifest::Row>& fresh) const {
+    const std::string stem = output_.stem().string();
+    const auto ending = [&](const std::string& name) { return shapeOf(name.substr(stem.size())); };
+    const auto isPicture = [](const std::string& shape) { return shape.ends_with("##.png"); };
+    std::set<std::string> shapes, names;
+    for (const auto& row : fresh) {
+        if (entryExists(work_.place(), row.name.c_str())) names.insert(row.name);
+        if (row.name.rfind(stem, 0) == 0 && ending(row.name).find("##") == 0) shapes.insert(ending(row.name));
+    }
+    if (shapes.empty()) return {names.begin(), names.end()};
+    const bool pictures = std::any_of(shapes.begin(), shapes.end(), isPicture);
+    bool hadPictures = false;
+    std::vector<std::string> all, sound;
+    listFolder(work_.place(), all);
+    for (const auto& name : all) {
+        if (name.rfind(stem, 0) != 0) continue;
+        const std::string shape = ending(name);
+        const bool isSound = pictures && (shape == ".wav" || shape == "##.wav");
+        if ((!isSound && shapes.count(shape) == 0) || !mayGo(sibling(output_, name))) continue;
+        if (isSound)
+            sound.push_back(name);
+        else
+            names.insert(name);
+        hadPictures = hadPictures || isPicture(shape);
+    }
+    // Sound alone may be anything.
+    if (hadPictures) names.insert(sound.begin(), sound.end());
+    return {names.begin(), names.end()};
+}
+
+Manifest Outputs::plan(const std::vector<fs::path>& files, const std::string& from) const {
+    Manifest set;
+    for (const auto& file : files) {
+        const fs::path name = finalName(file, from);
+        checkFinal(name);
+        const bool followsLink = !set_ && name == output_;
+        set.fresh.push_back({file.filename().string(), (followsLink ? target_ : name).filename().string()});
+    }
+    if (!policy_.overwrite) return set;
+    for (const auto& name : formerSet(set.fresh))
+        set.old.push_back({"old-" + std::to_string(set.old.size()), name});
+    for (const auto& row : set.fresh)
+        if (const int error =
+                keepAttributes(work_.handle(), row.hidden.c_str(), work_.place(), row.name.c_str()))
+            notPlaced({error, row.name, false});
+    return set;
+}
+
+void Outputs::notPlaced(const PlaceResult& result) const {
+    const std::string name =
+        (result.name.empty() ? output_ : sibling(output_, std::string(result.name))).string();
+    const std::string reason = std::strerror(result.error);
+    if (!result.torn && result.error == EEXIST) throw failure(Msg::outputExists, {name});
+    if (!result.torn) throw failure(Msg::outputNotPlaced, {name, reason});
+    throw failure(Msg::outputTorn, {name, reason, folderOf(set_ ? output_ : target_).string()});
+}
+
+// Files are brought to the disk before the lock is taken: a second signal must not wait for that.
+void Outputs::place(const Manifest& set) {
+    const bool one = set.fresh.size() == 1 &&
+                     (set.old.empty() || (set.old.size() == 1 && set.old[0].name == set.fresh[0].name));
+    SetPlacement placement(work_.handle(), work_.place(), set, policy_.sync);
+    PlaceResult result;
+    if (!one)
+        result = placement.prepare();
+    else if (policy_.sync)
+        result.error = syncFile(work_.handle(), set.fresh[0].hidden.c_str());
+    if (result.error != 0)
+        throw failure(Msg::outputNotSynced, {output_.string(), std::strerror(result.error)});
+    {
+        std::lock_guard guard(lock_);
+        moving_ = true;
+        result = one ? placeOne(work_.handle(), work_.place(), set.fresh[0], policy_.overwrite, policy_.sync)
+                     : placement.run();
+        if (result.torn) {
+            replaceLive(this, nullptr);
+            work_.leave();
+        }
+        moving_ = false;
+    }
+    if (result.error != 0) notPlaced(result);
 }
 
 std::vector<std::string> Outputs::commit(const std::string& from) {
@@ -213,23 +299,10 @@ std::vector<std::string> Outputs::commit(const std::string& from) {
         discard();
         return {output_.string()};
     }
+    const std::vector<fs::path> files = written();
     std::vector<std::string> names;
-    {
-        std::lock_guard guard(lock_);
-        const std::vector<fs::path> files = written();
-        std::vector<Placed> placed;
-        try {
-            for (const auto& file : files) {
-                const fs::path name = finalName(file, from);
-                checkFinal(name);
-                placed.push_back({file, name, place(file, name, overwrite_)});
-                names.push_back(name.string());
-            }
-        } catch (...) {
-            for (auto p = placed.rbegin(); p != placed.rend(); ++p) takeBack(*p);
-            throw;
-        }
-    }
+    for (const auto& file : files) names.push_back(finalName(file, from));
+    if (!files.empty()) place(plan(files, from));
     discard();
     const auto first = std::find(names.begin(), names.end(), output_.string());
     if (first != names.end()) std::rotate(names.begin(), first, first + 1);
@@ -238,24 +311,17 @@ std::vector<std::string> Outputs::commit(const std::string& from) {
 
 void Outputs::discard() {
     std::lock_guard guard(lock_);
-    if (folderHandle_ < 0) return;
+    if (!work_) return;
     replaceLive(this, nullptr);
-    remove();
-}
-
-void Outputs::remove() {
-    removeAll(folderHandle_);
-    close(folderHandle_);
-    folderHandle_ = -1;
-    rmdir(folder_.c_str());
+    work_.remove();
 }
 
 bool Outputs::abandonAll() {
     bool any = false;
     for (auto& live : g_live) {
         Outputs* outputs = live.exchange(nullptr);
-        if (!outputs) continue;
-        outputs->remove();
+        if (!outputs || outputs->moving_) continue;
+        outputs->work_.remove();
         any = true;
     }
     return any;

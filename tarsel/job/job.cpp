@@ -78,7 +78,7 @@ void Job::chooseOutput() {
                           "." + suggestion(extension, known) + " 'tarsel formats' lists all");
     }
     kind_ = row == std::end(kKinds) ? OutputKind::raw : row->kind;
-    outputs_ = std::make_unique<Outputs>(options_.output, "-o", options_.inputs, options_.overwrite);
+    outputs_ = std::make_unique<Outputs>(options_.output, "-o", options_.inputs, options_.policy);
     if (kind_ == OutputKind::pictures) outputs_->checkNumbered("png");
     if (options_.splitChannels) outputs_->checkNumbered("wav");
 }
@@ -287,6 +287,9 @@ void Job::addStream(JobStream& stream) {
 // Names that exist are refused before any work; what is written beside the output counts as well.
 void Job::checkNames() const {
     if (!outputs_ || outputs_->isDevice()) return;
+    if (kind_ == OutputKind::pictures || options_.splitChannels ||
+        (kind_ != OutputKind::avi && streams_.size() > 1))
+        outputs_->expectSet();
     pipe_->setFilename(Any(outputs_->hiddenName(primaryExtension()).c_str()));
     const Any names = pipe_->getMuxer()->QvCodec::getParam("filenames");
     if (!names.isVector()) return;
@@ -322,7 +325,7 @@ void Job::planPicture(JobStream& stream) const {
     const FiltersState state = stream.picture->filters(stream.expected, false);
     if (!state.empty()) stream.params.setFilters(state);
     const auto pipe = tryPipe(stream.picture->job(state));
-    if (pipe) checkFilterFiles(*pipe, options_.inputs, outputs_.get(), options_.overwrite);
+    if (pipe) checkFilterFiles(*pipe, options_.inputs, outputs_.get(), options_.policy);
     stream.chain = describe(pipe.get());
 }
 

@@ -22,7 +22,8 @@ struct JobOptions {
     EffectOptions effects;
     std::optional<int> samplerate, channels, bits;
     ProgressMode progress = ProgressMode::automatic;
-    bool overwrite = false, splitChannels = false, dryRun = false, acceptPartial = false, quiet = false;
+    OutputPolicy policy{false};
+    bool splitChannels = false, dryRun = false, acceptPartial = false, quiet = false;
 };
 
 // What an output name stands for.
@@ -82,6 +83,9 @@ class Job {
     void checkNames() const;
     void checkDamage();
     void checkSpace() const;
+    void redirectFilters();
+    void discard();
+    std::string withFinalNames(std::string text) const;
     void link(Runner& runner) const;
     int runLinked(Runner& runner, Progress& progress);
     [[noreturn]] void stopped(Exit signalled) const;
@@ -100,6 +104,7 @@ class Job {
     std::vector<std::unique_ptr<Source>> sources_;
     std::vector<JobStream> streams_;
     std::unique_ptr<Outputs> outputs_, taskFile_;
+    std::vector<std::unique_ptr<Outputs>> filterFiles_;  // what filters write
     std::unique_ptr<QvEncodePipe> pipe_;
     std::vector<std::string> warnings_;
 };

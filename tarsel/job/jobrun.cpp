@@ -110,10 +110,10 @@ class Job::Runner : public QvTranscoder {
         }
     }
 
-    static Failure failureOf(const QvCodec& filter) {
+    Failure failureOf(const QvCodec& filter) const {
         const bool writes = !filterFile(filter, QV_GUI_FILESELECT_SAVE).empty();
         return {writes ? Exit::output : Exit::failed, "the filter " + std::string(filter.name()) + ": " +
-                                                          inLine(filter.errorDesc()) +
+                                                          inLine(job_.withFinalNames(filter.errorDesc())) +
                                                           (writes ? "" : "; nothing was left behind")};
     }
 
@@ -172,6 +172,7 @@ int Job::runLinked(Runner& runner, Progress& progress) {
 
 void Job::run() {
     checkSpace();
+    redirectFilters();
     Progress progress(options_.quiet ? ProgressMode::off : options_.progress, "task 1 of 1  ");
     std::vector<std::string> names;
     {
@@ -179,24 +180,54 @@ void Job::run() {
         link(runner);
         const Signals::Watch watch(
             signals_, [&] { runner.requestStop(); },
-            [&] {
-                if (outputs_) outputs_->discard();
-            });
+            [&] { discard(); });
         const int result = runLinked(runner, progress);
-        if (const Exit signalled = signals_.received(); signalled != Exit::done) stopped(signalled);
+        if (const Exit signalled = signals_.received(); signalled != Exit::done) {
+            discard();
+            stopped(signalled);
+        }
         if (result != 0 && result != QvStatus::endOfStream) fail(runner);
         if (runner.filterFailure()) throw *runner.filterFailure();
         takeWarnings();
         checkResult();
         if (outputs_) names = outputs_->commit("raw");
+        for (auto& file : filterFiles_) file->commit("");
     }
     showWarnings();
     if (!options_.quiet) report(names);
     if (!options_.post.empty()) runPost(names);
 }
 
-void Job::stopped(Exit signalled) const {
+// What filters write is an output like the others: it gets its name when the job is complete. A device takes
+// it as it comes.
+void Job::redirectFilters() {
+    for (JobStream& stream : streams_) {
+        const Any& filters = stream.params.get("filters");
+        if (stream.type != 1 || !filters.isDict()) continue;
+        FiltersState state(filters.asDict());
+        renameFilterFiles(state, [&](const std::string& file, const char* filter) {
+            auto output = std::make_unique<Outputs>(file, std::string("--filter ") + filter, options_.inputs,
+                                                    options_.policy);
+            if (output->isDevice()) return file;
+            filterFiles_.push_back(std::move(output));
+            return filterFiles_.back()->begin("");
+        });
+        stream.params.setFilters(state);
+    }
+}
+
+void Job::discard() {
     if (outputs_) outputs_->discard();
+    for (auto& file : filterFiles_) file->discard();
+}
+
+std::string Job::withFinalNames(std::string text) const {
+    if (outputs_) text = outputs_->withFinalNames(std::move(text));
+    for (const auto& file : filterFiles_) text = file->withFinalNames(std::move(text));
+    return text;
+}
+
+void Job::stopped(Exit signalled) const {
     const bool device = outputs_ && outputs_->isDevice();
     throw Failure(signalled, device ? "stopped; " + inQuotes(options_.output) + " has a part of it"
                                     : "stopped; nothing was left behind");
@@ -222,10 +253,10 @@ void Job::fail(Runner& runner) const {
     take(pipe_.get());
     if (!reason.empty() && outputs_)
         throw Failure(Exit::output, "can't write " + inQuotes(outputs_->output().string()) + ": " +
-                                        inLine(outputs_->withFinalNames(reason)));
+                                        inLine(withFinalNames(reason)));
     if (runner.filterFailure()) throw *runner.filterFailure();
     reason = runner.reason();
-    throw Failure(Exit::failed, inLine(outputs_ ? outputs_->withFinalNames(reason) : reason));
+    throw Failure(Exit::failed, inLine(withFinalNames(reason)));
 }
 
 void Job::showWarnings() const {

@@ -347,19 +347,48 @@ void addSettings(const AnyDict& state, const AnyDict& initial, std::string& line
 
 }  // namespace
 
-std::string filterFile(const QvCodec& filter, int guiControl) {
+namespace {
+
+// The first parameter of a filter that is a file of this kind and names one; empty without.
+std::string fileParam(const QvCodec& filter, int guiControl) {
     const Any set = filter.getParam("paramSet");
     for (int i = 0; set.isVector() && i < set.asVector().size(); ++i) {
         const AnyDict& described = set.asVector().at(i).asDict();
         if (described.getInt32("guiControl", 0) != guiControl) continue;
-        const Any value = filter.getParam(described.getString("name", "")).toString();
-        if (*value.asString("")) return value.asString("");
+        const char* name = described.getString("name", "");
+        const Any value = filter.getParam(name).toString();
+        if (*value.asString("")) return name;
     }
     return "";
 }
 
+}  // namespace
+
+std::string filterFile(const QvCodec& filter, int guiControl) {
+    const std::string param = fileParam(filter, guiControl);
+    if (param.empty()) return "";
+    const Any value = filter.getParam(param.c_str()).toString();
+    return value.asString("");
+}
+
+void renameFilterFiles(FiltersState& filters,
+                       const std::function<std::string(const std::string& file, const char* filter)>& other) {
+    const AnyVector names = filters.names();
+    for (int i = 0; i < filters.count(); ++i) {
+        AnyDict dict = filters.filterAt(i);
+        const std::unique_ptr<QvCodec> filter(qv_registry()->newCodec(names.at(i).asString("")));
+        const std::string param = filter ? fileParam(*filter, QV_GUI_FILESELECT_SAVE) : "";
+        if (param.empty() || !dict.get(param.c_str()).isText()) continue;
+        const Any file = dict.get(param.c_str()).toString();
+        // Without a name it fails in its own words.
+        if (file == filter->getParam(param.c_str()).toString()) continue;
+        dict.set(param.c_str(), other(file.asString(""), filter->name()).c_str());
+        filters.setFilterAt(i, dict);
+    }
+}
+
 void checkFilterFiles(const QvVProcessPipe& pipe, const std::vector<std::string>& inputs,
-                      const Outputs* outputs, bool overwrite) {
+                      const Outputs* outputs, const OutputPolicy& policy) {
     const auto checkOutput = [&](const std::string& name, const char* what) {
         if (outputs && !outputs->isDevice() && samePlace(name, outputs->output()))
             throw Failure(Exit::output, "can't write " + inQuotes(name) + ": it is also " + what);
@@ -374,7 +403,7 @@ void checkFilterFiles(const QvVProcessPipe& pipe, const std::vector<std::string>
         const QvCodec& filter = *pipe.filter(i);
         const std::string name = filterFile(filter, QV_GUI_FILESELECT_SAVE);
         if (name.empty()) continue;
-        const Outputs checked(name, std::string("--filter ") + filter.name(), read, overwrite);
+        const Outputs checked(name, std::string("--filter ") + filter.name(), read, policy);
         checkOutput(name, "the output of the job");
     }
 }

@@ -1,6 +1,7 @@
 // The way of a picture from a stream to an output: its format at both ends and the filters between them.
 #pragma once
 
+#include <functional>
 #include <optional>
 #include <string>
 #include <vector>
@@ -61,10 +62,14 @@ AnyDict filterState(const std::string& spec);
 // descriptions of parameters say; empty without one.
 std::string filterFile(const QvCodec& filter, int guiControl);
 
+// Gives each filter that writes a file another name for it, `other(file, filter)`.
+void renameFilterFiles(FiltersState& filters,
+                       const std::function<std::string(const std::string& file, const char* filter)>& other);
+
 // That what filters read is not overwritten by `outputs` (null: there is none), and what they write is
-// neither an input nor an output and, unless `overwrite`, does not exist. Throws Failure.
+// neither an input nor an output and, unless `policy` overwrites, does not exist. Throws Failure.
 void checkFilterFiles(const QvVProcessPipe& pipe, const std::vector<std::string>& inputs,
-                      const Outputs* outputs, bool overwrite);
+                      const Outputs* outputs, const OutputPolicy& policy);
 
 // The pipe of a job, null if it has nothing to do. Each filter has been tried, so that what fails later fails
 // by chance. Throws Failure.

@@ -11,6 +11,22 @@ constexpr Message kMessages[] = {
     {Msg::outputExists,       Exit::output, "can't write {file}", "it exists",                       "use -y to overwrite it"},
     {Msg::outputIsInput,      Exit::output, "can't write {file}", "it is also an input",             "give the output another name"},
     {Msg::outputFolderAbsent, Exit::output, "can't write {file}", "the folder {file} does not exist", "make the folder first"},
+    {Msg::outputNotPlaced,    Exit::output, "can't write {file}", "{system}",                        "what was there before is unchanged"},
+    {Msg::outputTorn,         Exit::output, "can't write {file}", "{system}, and the files that it replaces could not all be put back", "'tarsel recover {text}' finishes it when the reason is gone"},
+    {Msg::outputNotSynced,    Exit::output, "can't write {file}", "the disk did not take it ({system})", "check the disk; what was there before is unchanged"},
+    {Msg::setCompleted,       Exit::done,   "completed what an ended run had begun", "{text} in {file} are the new ones", ""},
+    {Msg::setRestored,        Exit::done,   "took back what an ended run had begun", "{text} in {file} are the old ones", ""},
+    {Msg::leftRemoved,        Exit::done,   "removed what an ended run left", "{text}, {text}", ""},
+    {Msg::workInUse,          Exit::done,   "left {file} alone", "the run that writes there is at work", ""},
+    {Msg::workNotOurs,        Exit::failed, "left {file} alone", "it belongs to another user, or others may write into it", "its owner can recover it"},
+    {Msg::workElsewhere,      Exit::failed, "left {file} alone", "a run on the host {name} may be at work there", "when that run has ended, 'tarsel recover {text}' removes it"},
+    {Msg::workOwnerless,      Exit::failed, "left {file} alone", "it does not say which run it belongs to", "when no run is at work there, 'tarsel recover {text}' removes it"},
+    {Msg::manifestUnreadable, Exit::failed, "left {file} alone", "its manifest is damaged", "look for files to keep in it, then remove it"},
+    {Msg::setInTheWay,        Exit::failed, "can't finish {file}", "{file} exists and is not of that run", "move it away, then use 'tarsel recover {text}'"},
+    {Msg::workStays,          Exit::failed, "can't remove {file}", "{system}", "remove it by hand, or try 'tarsel recover' later"},
+    {Msg::recoverNoFolder,    Exit::usage,  "can't recover {file}", "{system}", "give the folder that the outputs are in"},
+    {Msg::recoverUnfinished,  Exit::failed, "can't recover all of {file}", "{text} stayed", "do what the lines before say"},
+    {Msg::staleNoAge,         Exit::usage,  "can't use --stale {name}", "this is no age",             "use 90s, 90m, 12h, 30d or never"},
 };
 // clang-format on
 

@@ -13,6 +13,22 @@ enum class Msg : unsigned char {
     outputExists,
     outputIsInput,
     outputFolderAbsent,
+    outputNotPlaced,
+    outputTorn,
+    outputNotSynced,
+    setCompleted,
+    setRestored,
+    leftRemoved,
+    workInUse,
+    workNotOurs,
+    workElsewhere,
+    workOwnerless,
+    manifestUnreadable,
+    setInTheWay,
+    workStays,
+    recoverNoFolder,
+    recoverUnfinished,
+    staleNoAge,
     count,  // of messages, none itself
 };
 

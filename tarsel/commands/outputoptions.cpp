@@ -1,0 +1,40 @@
+#include "tarsel/commands/outputoptions.h"
+
+#include <charconv>
+
+#include "tarsel/words/commandline.h"
+#include "tarsel/words/messages.h"
+
+namespace {
+
+// "90s", "90m", "12h", "30d" in seconds; -1 for "never".
+long long parseAge(const std::string& text) {
+    constexpr struct {
+        char unit;
+        long long seconds;
+    } units[] = {{'s', 1}, {'m', 60}, {'h', 3600}, {'d', 24 * 3600}};
+    if (text == "never") return -1;
+    long long count = 0;
+    const char* last = text.data() + text.size();
+    const auto [end, error] = std::from_chars(text.data(), last, count);
+    for (const auto& row : units)
+        if (error == std::errc() && end + 1 == last && *end == row.unit && count >= 0 && count <= 1000000)
+            return count * row.seconds;
+    throw failure(Msg::staleNoAge, {text});
+}
+
+}  // namespace
+
+void OutputOptions::add(Command& command) {
+    command.flag("-y,--overwrite", overwrite, "Overwrite existing outputs");
+    command.flag("--no-sync", noSync, "Don't wait until the disk has the outputs");
+    command.option("--stale", stale,
+                   "Age after which what another host's run left goes: 90m, 12h, 30d, never (7d)", "AGE");
+}
+
+OutputPolicy OutputOptions::policy() const {
+    OutputPolicy policy(overwrite);
+    policy.sync = !noSync;
+    if (!stale.empty()) policy.stale = parseAge(stale);
+    return policy;
+}

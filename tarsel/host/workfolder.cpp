@@ -1,0 +1,104 @@
+#include "tarsel/host/workfolder.h"
+
+#include <cerrno>
+#include <cstring>
+#include <filesystem>
+
+#include <dirent.h>
+#include <fcntl.h>
+#include <stdlib.h>
+#include <sys/file.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include "tarsel/host/foldercalls.h"
+#include "tarsel/host/manifest.h"
+#include "tarsel/host/owner.h"
+
+namespace {
+
+// Removes the plain files and links of a folder; how many entries went. Those that a manifest or the owner
+// stands in are not counted as files.
+int removeOnce(int folder, WorkFolder::Removed& removed) {
+    int count = 0;
+    alignas(dirent64) char entries[4096];
+    lseek(folder, 0, SEEK_SET);
+    for (ssize_t size; (size = getdents64(folder, entries, sizeof entries)) > 0;)
+        for (ssize_t at = 0; at < size;) {
+            const auto* entry = reinterpret_cast<const dirent64*>(entries + at);
+            at += entry->d_reclen;
+            if (std::strcmp(entry->d_name, WorkFolder::kOwner) == 0) continue;
+            struct stat status;
+            const bool known = fstatat(folder, entry->d_name, &status, AT_SYMLINK_NOFOLLOW) == 0;
+            if (unlinkat(folder, entry->d_name, 0) != 0) continue;  // fails for "." and ".."
+            ++count;
+            if (!known || std::strcmp(entry->d_name, Manifest::kDraft) == 0) continue;
+            ++removed.files;
+            removed.bytes += status.st_size;
+        }
+    return count;
+}
+
+}  // namespace
+
+// False if a run that cleans the place has taken the folder for one that was left: it is empty until its
+// owner is named.
+bool WorkFolder::lockNew() {
+    struct stat status;
+    if (flock(owner_.get(), LOCK_EX | LOCK_NB) != 0 && errno == EWOULDBLOCK) return false;
+    return fstat(owner_.get(), &status) != 0 || status.st_nlink > 0;
+}
+
+int WorkFolder::make(const std::string& place) {
+    constexpr int kAttempts = 100;
+    place_.reset(openFolder(place.c_str()));
+    if (!place_) return errno;
+    const std::string record = Owner::self().text();
+    for (int attempt = 0; attempt < kAttempts; ++attempt) {
+        path_ = (std::filesystem::path(place) / (std::string(kPrefix) + "XXXXXX")).string();
+        if (!mkdtemp(path_.data())) return errno;
+        name_ = std::filesystem::path(path_).filename().string();
+        folder_.reset(openat(place_.get(), name_.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
+        if (!folder_ && errno == ENOENT) continue;
+        int error = folder_ ? 0 : errno;
+        if (error == 0) {
+            owner_.reset(openat(folder_.get(), kOwner, O_RDWR | O_CREAT | O_EXCL | O_CLOEXEC, 0600));
+            if (!owner_ && errno == ENOENT) continue;
+            error = owner_ ? 0 : errno;
+        }
+        if (error == 0 && !lockNew()) continue;
+        if (error == 0) {
+            const ssize_t written = write(owner_.get(), record.data(), record.size());
+            if (written == static_cast<ssize_t>(record.size())) return 0;
+            error = written < 0 ? errno : ENOSPC;
+        }
+        if (folder_)
+            remove();
+        else
+            unlinkat(place_.get(), name_.c_str(), AT_REMOVEDIR);
+        return error;
+    }
+    folder_.reset();
+    owner_.reset();
+    return EBUSY;
+}
+
+WorkFolder::Removed WorkFolder::remove() {
+    Removed removed;
+    if (!folder_) return removed;
+    unlinkat(folder_.get(), Manifest::kMovingOldIn, 0);
+    unlinkat(folder_.get(), Manifest::kMovingNewOut, 0);
+    // What is removed while a folder is listed may hide other entries.
+    while (removeOnce(folder_.get(), removed) > 0) {
+    }
+    unlinkat(folder_.get(), kOwner, 0);
+    unlinkat(place_.get(), name_.c_str(), AT_REMOVEDIR);
+    leave();
+    return removed;
+}
+
+void WorkFolder::leave() {
+    folder_.reset();
+    owner_.reset();
+    place_.reset();
+}

@@ -1,0 +1,214 @@
+// Results get their names as a whole, whatever ends the run or fails in between.
+#include "tarsel/host/outputs.h"
+
+#include <gtest/gtest.h>
+
+#include <map>
+
+#include "tarsel/host/recovery.h"
+#include "tarsel/words/failure.h"
+#include "tests/support/child.h"
+#include "tests/support/temp_folder.h"
+
+namespace {
+
+namespace fs = std::filesystem;
+
+using Files = std::map<std::string, std::string>;
+
+struct Job {
+    const char* what;
+    std::string output, extension;
+    Files before;
+    Files written;  // by the engine's names
+    Files after;
+};
+
+const Job kJobs[] = {
+    {"a file", "a.wav", "wav", {}, {{"out.wav", "new"}}, {{"a.wav", "new"}}},
+    {"over a file", "a.wav", "wav", {{"a.wav", "old"}}, {{"out.wav", "new"}}, {{"a.wav", "new"}}},
+    {"two files",
+     "a.yuv",
+     "raw",
+     {{"x", "x"}},
+     {{"out.raw", "new"}, {"out.wav", "n"}},
+     {{"a.yuv", "new"}, {"a.wav", "n"}, {"x", "x"}}},
+    {"a shorter sequence without sound",
+     "a.png",
+     "png",
+     {{"a#00.png", "0"}, {"a#01.png", "1"}, {"a#02.png", "2"}, {"a.wav", "s"}, {"a#00.wav", "c"}},
+     {{"out#0.png", "n0"}, {"out#1.png", "n1"}},
+     {{"a#0.png", "n0"}, {"a#1.png", "n1"}}},
+    {"what is of another set",
+     "a.png",
+     "png",
+     {{"a#0.png", "0"},
+      {"a#0#1.png", "b"},
+      {"a2#0.png", "b"},
+      {"a#x.png", "b"},
+      {"a.png", "b"},
+      {"a#1.bmp", "b"}},
+     {{"out#0.png", "n0"}, {"out.wav", "n"}},
+     {{"a#0.png", "n0"},
+      {"a.wav", "n"},
+      {"a#0#1.png", "b"},
+      {"a2#0.png", "b"},
+      {"a#x.png", "b"},
+      {"a.png", "b"},
+      {"a#1.bmp", "b"}}},
+    {"sound that had no pictures",
+     "a.png",
+     "png",
+     {{"a.wav", "b"}},
+     {{"out#0.png", "n"}},
+     {{"a.wav", "b"}, {"a#0.png", "n"}}},
+    {"fewer channels",
+     "a.wav",
+     "wav",
+     {{"a#00.wav", "0"}, {"a#01.wav", "1"}, {"a.wav", "mix"}},
+     {{"out#00.wav", "n"}},
+     {{"a#00.wav", "n"}, {"a.wav", "mix"}}},
+};
+
+// Hundreds of runs bring their files to the disk: where there is one in memory, it is used.
+struct FastFolder {
+    FastFolder() {
+        if (access("/dev/shm", W_OK) == 0) setenv("TMPDIR", "/dev/shm", 0);
+    }
+};
+
+class OutputsTest : public testing::Test {
+  protected:
+    // By names in the folder: under /dev, full names are those of devices.
+    OutputsTest() { fs::current_path(folder.path()); }
+    ~OutputsTest() override { fs::current_path("/"); }
+
+    void fill(const Files& files) const {
+        for (const auto& entry : fs::directory_iterator(folder.path())) fs::remove_all(entry);
+        for (const auto& [name, bytes] : files) folder.write(name, bytes);
+    }
+    // With work folders, whose names differ, as "work".
+    Files found() const {
+        Files files;
+        for (const auto& entry : fs::directory_iterator(folder.path()))
+            if (entry.is_directory())
+                files["work"] = "";
+            else
+                files[entry.path().filename().string()] = TempFolder::read(entry.path().string());
+        return files;
+    }
+    static OutputPolicy policy() {
+        OutputPolicy policy(true);
+        policy.quiet = true;
+        return policy;
+    }
+    int run(const Job& job) const {
+        try {
+            Outputs outputs(job.output, "-o", {}, policy());
+            if (job.written.size() > 1) outputs.expectSet();
+            const fs::path work = fs::path(outputs.begin(job.extension)).parent_path();
+            for (const auto& [name, bytes] : job.written) std::ofstream(work / name) << bytes;
+            outputs.commit("raw");
+            return 0;
+        } catch (const Failure& failure) {
+            return static_cast<int>(failure.exit());
+        }
+    }
+    std::vector<Leftover> recover() const { return recoverPlace(folder.path().string(), {}); }
+
+    FastFolder fast;
+    TempFolder folder;
+};
+
+TEST_F(OutputsTest, ASetReplacesTheFormerOneAndNothingElse) {
+    for (const auto& job : kJobs) {
+        fill(job.before);
+        EXPECT_EQ(run(job), 0) << job.what;
+        EXPECT_EQ(found(), job.after) << job.what;
+    }
+}
+
+TEST_F(OutputsTest, AKillBetweenAnyTwoCallsLeavesAllOldOrAllNew) {
+    for (const auto& job : kJobs) {
+        bool old = false, fresh = false;
+        for (int n = 1;; ++n) {
+            fill(job.before);
+            if (!killedBefore(n, [&] { return run(job); })) break;
+            for (const auto& left : recover()) EXPECT_FALSE(left.remains()) << job.what << n;
+            const Files now = found();
+            old = old || now == job.before;
+            fresh = fresh || now == job.after;
+            EXPECT_TRUE(now == job.before || now == job.after) << job.what << ", call " << n;
+        }
+        EXPECT_TRUE(old && fresh) << job.what;
+    }
+}
+
+// The recovery is killed as well, and the next one finishes.
+TEST_F(OutputsTest, ARecoveryMayBeKilled) {
+    const Job& job = kJobs[3];
+    std::vector<int> stages;  // a kill in each state that leaves a work folder with something to do
+    for (int n = 1;; ++n) {
+        fill(job.before);
+        if (!killedBefore(n, [&] { return run(job); })) break;
+        const auto left = recover();
+        if (!left.empty() && left[0].outcome != Leftover::Outcome::removed) stages.push_back(n);
+    }
+    ASSERT_GE(stages.size(), 10u);
+    for (const int stage :
+         {stages.front(), stages[stages.size() / 3], stages[stages.size() / 2], stages.back()}) {
+        Files first;
+        for (int n = 1;; ++n) {
+            fill(job.before);
+            ASSERT_TRUE(killedBefore(stage, [&] { return run(job); }));
+            const bool killed = killedBefore(n, [&] { return recover().empty(); });
+            recover();
+            if (first.empty()) first = found();
+            EXPECT_TRUE(first == job.before || first == job.after);
+            EXPECT_EQ(found(), first) << stage << ", " << n;
+            if (!killed) break;
+        }
+    }
+}
+
+TEST_F(OutputsTest, WhatTheDiskDoesNotTakeLeavesTheOld) {
+    for (const auto& job : kJobs)
+        for (const int call : {SYS_fdatasync, SYS_syncfs, SYS_fsync, SYS_renameat2})
+            for (const int error : {EIO, ENOSPC, ENOTSUP}) {
+                fill(job.before);
+                const int status = inChild([&] {
+                    failCalls({call}, error);
+                    return run(job);
+                });
+                const bool single = job.written.size() == 1 && job.before.size() <= 1;
+                const bool used =
+                    call == SYS_fsync || call == SYS_renameat2 || (call == SYS_fdatasync) == single;
+                // A file system that knows no synchronisation has nothing to fail.
+                const bool harmless = call != SYS_renameat2 && error == ENOTSUP;
+                EXPECT_EQ(status, used && !harmless ? 4 : 0) << job.what << call << ", " << error;
+                EXPECT_EQ(found(), status == 0 ? job.after : job.before) << job.what << call << ", " << error;
+            }
+}
+
+TEST_F(OutputsTest, WhatIsInTheWayIsKept) {
+    const Job& job = kJobs[3];
+    for (int n = 1; found().count("work") == 0 || recover()[0].outcome != Leftover::Outcome::inTheWay; ++n) {
+        fill(job.before);
+        ASSERT_TRUE(killedBefore(n, [&] { return run(job); }));
+        for (const auto& [name, bytes] : job.after)
+            if (!fs::exists(folder.file(name))) folder.write(name, "of another");
+        for (const auto& [name, bytes] : job.before)
+            if (!fs::exists(folder.file(name))) folder.write(name, "of another");
+    }
+    Files now = found();
+    const auto left = recover();
+    EXPECT_EQ(now, found());
+    EXPECT_EQ(now[left.at(0).detail], "of another");
+    for (const auto& [name, bytes] : now)
+        if (bytes == "of another") fs::remove(folder.file(name));
+    EXPECT_FALSE(recover().at(0).remains());
+    now = found();
+    EXPECT_TRUE(now == job.before || now == job.after);
+}
+
+}  // namespace
