@@ -179,8 +179,7 @@ void Job::run() {
         Runner runner(*this, progress);
         link(runner);
         const Signals::Watch watch(
-            signals_, [&] { runner.requestStop(); },
-            [&] { discard(); });
+            signals_, [&] { runner.requestStop(); }, [&] { discard(); });
         const int result = runLinked(runner, progress);
         if (const Exit signalled = signals_.received(); signalled != Exit::done) {
             discard();

@@ -2,8 +2,7 @@
 #include "tarsel/job/job.h"
 
 void Job::saveTask() {
-    taskFile_ =
-        std::make_unique<Outputs>(options_.saveTask, "--save-task", options_.inputs, options_.policy);
+    taskFile_ = std::make_unique<Outputs>(options_.saveTask, "--save-task", options_.inputs, options_.policy);
     if (outputs_ && taskFile_->output() == outputs_->output())
         throw Failure(Exit::output, "can't write " + inQuotes(options_.saveTask) + ": it is also the output");
     QvTask task;

@@ -378,11 +378,14 @@ void renameFilterFiles(FiltersState& filters,
         AnyDict dict = filters.filterAt(i);
         const std::unique_ptr<QvCodec> filter(qv_registry()->newCodec(names.at(i).asString("")));
         const std::string param = filter ? fileParam(*filter, QV_GUI_FILESELECT_SAVE) : "";
-        if (param.empty() || !dict.get(param.c_str()).isText()) continue;
-        const Any file = dict.get(param.c_str()).toString();
+        if (param.empty()) continue;
+        const Any initial = filter->getParam(param.c_str());
+        filter->restore(dict);
+        const Any file = filter->getParam(param.c_str()).toString();
         // Without a name it fails in its own words.
-        if (file == filter->getParam(param.c_str()).toString()) continue;
-        dict.set(param.c_str(), other(file.asString(""), filter->name()).c_str());
+        if (file == initial || !*file.asString("")) continue;
+        filter->setParam(param.c_str(), other(file.asString(""), filter->name()).c_str());
+        filter->store(dict);
         filters.setFilterAt(i, dict);
     }
 }

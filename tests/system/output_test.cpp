@@ -113,4 +113,96 @@ TEST_F(Output, ThePostCommandSeesFinalNames) {
                                       testing::HasSubstr("'kept.wav'")));
 }
 
+TEST_F(Output, KeepsWhatTheReplacedFileWasToOthers) {
+    const auto stat = [&](const std::string& name) {
+        struct stat status {};
+        lstat(folder.file(name).c_str(), &status);
+        return status;
+    };
+    const auto isNew = [&](const std::string& name) {
+        return wavPart(contents("in.wav"), "data") == wavPart(contents(name), "data");
+    };
+    for (const mode_t mode : {0600u, 0444u, 0664u, 04755u}) {
+        folder.write("out.wav", "old");
+        ASSERT_EQ(chmod(folder.file("out.wav").c_str(), mode), 0);
+        if (geteuid() == 0) {
+            ASSERT_EQ(chown(folder.file("out.wav").c_str(), 65534, 65533), 0);
+            ASSERT_EQ(chmod(folder.file("out.wav").c_str(), mode), 0);
+        }
+        works({"transcode", "in.wav", "-o", "out.wav", "-y"});
+        EXPECT_TRUE(isNew("out.wav"));
+        EXPECT_EQ(stat("out.wav").st_mode & 07777u, mode & 0777u);
+        if (geteuid() == 0) {
+            EXPECT_EQ(stat("out.wav").st_uid, 65534u);
+            EXPECT_EQ(stat("out.wav").st_gid, 65533u);
+        }
+        fs::remove(folder.file("out.wav"));
+    }
+    folder.write("first.wav", "old");
+    fs::create_hard_link(folder.file("first.wav"), folder.file("second.wav"));
+    works({"transcode", "in.wav", "-o", "first.wav", "-y"});
+    EXPECT_TRUE(isNew("first.wav"));
+    EXPECT_EQ(contents("second.wav"), "old");
+}
+
+TEST_F(Output, FollowsALinkForOneFile) {
+    fs::create_directory(folder.file("sub"));
+    folder.write("sub/real.wav", "old");
+    for (const char* to : {"sub/real.wav", "sub/none.wav"}) {
+        fs::remove(folder.file("link.wav"));
+        fs::create_symlink(to, folder.file("link.wav"));
+        const Outcome o = works({"transcode", "in.wav", "-o", "link.wav", "-y"});
+        EXPECT_THAT(o.err, testing::HasSubstr("wrote 'link.wav'"));
+        EXPECT_EQ(fs::read_symlink(folder.file("link.wav")), to);
+        EXPECT_TRUE(wavPart(contents("in.wav"), "data") == wavPart(contents(to), "data"));
+    }
+    fs::create_symlink("no/where.wav", folder.file("lost.wav"));
+    fails(4, {"transcode", "in.wav", "-o", "lost.wav", "-y"}, {"where.wav'", "does not exist"});
+    // Two files: each name is a file, and what the link led to is left as it was.
+    folder.write("sub/real.raw", "old");
+    fs::create_symlink("sub/real.raw", folder.file("card.raw"));
+    works({"transcode", kCard, "-o", "card.raw", "-y"});
+    EXPECT_TRUE(fs::is_regular_file(fs::symlink_status(folder.file("card.raw"))));
+    EXPECT_EQ(contents("sub/real.raw"), "old");
+}
+
+TEST_F(Output, AShorterRunLeavesNoTail) {
+    works({"transcode", "testgen:size=32x32,rate=25,duration=0.48", "-o", "card.png"});
+    EXPECT_EQ(size("card#11.png") > 0 && size("card.wav") > 0, true);
+    const auto before = listing();
+    fails(4, {"transcode", "testgen:size=32x32,rate=25,duration=0.08", "-o", "card.png"}, {"'card#", "-y"});
+    EXPECT_EQ(listing(), before);
+    works({"transcode", "testgen:size=32x32,rate=25,duration=0.08,audio=0", "-o", "card.png", "-y"});
+    EXPECT_EQ(listing(), (std::set<std::string>{"in.wav", "card#0.png", "card#1.png"}));
+}
+
+// Killed while it writes: the next run in the folder removes what is left, and says so unless it is told not
+// to.
+TEST_F(Output, WhatAKilledRunLeftGoesWithTheNext) {
+    const Words endless = words({"transcode", "testgen:size=64x64,rate=25,duration=20000,audio=0", "-o",
+                                 "out.raw", "--filter", "rawdump:filename=dump", "--progress", "json"});
+    const auto kill = [&] {
+        Process run(endless, here());
+        ASSERT_TRUE(run.waitFor("\"event\":\"progress\""));
+        EXPECT_EQ(tarsel({"recover", "."}).status, 0);
+        run.signal(SIGKILL);
+        run.finish();
+        EXPECT_GT(listing().size(), 1u);
+    };
+    kill();
+    const Outcome o = works({"transcode", "in.wav", "-o", "a.wav"});
+    EXPECT_THAT(o.err, testing::HasSubstr("removed what an ended run left: 2 files, "));
+    EXPECT_EQ(listing(), (std::set<std::string>{"a.wav", "in.wav"}));
+    kill();
+    EXPECT_EQ(works({"transcode", "in.wav", "-o", "b.wav", "-q", "--dry-run"}).err, "");
+    EXPECT_GT(listing().size(), 2u);
+    EXPECT_EQ(works({"transcode", "in.wav", "-o", "b.wav", "-q"}).err, "");
+    EXPECT_EQ(listing(), (std::set<std::string>{"a.wav", "b.wav", "in.wav"}));
+    kill();
+    EXPECT_THAT(works({"recover", "."}).err, testing::HasSubstr("2 files, "));
+    EXPECT_EQ(listing(), (std::set<std::string>{"a.wav", "b.wav", "in.wav"}));
+    fails(2, {"recover", "no"}, {"'no'", "no such folder"});
+    fails(2, {"transcode", "in.wav", "-o", "c.wav", "--stale", "1w"}, {"--stale", "'1w'", "12h"});
+}
+
 }  // namespace

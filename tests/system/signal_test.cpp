@@ -31,7 +31,7 @@ TEST_F(Signal, StopsAndLeavesWhatWasThere) {
     } cases[] = {{SIGINT, 130, {}}, {SIGTERM, 143, {}}, {SIGHUP, 129, {"out.raw"}}};
     for (const auto& c : cases) {
         for (const auto& name : c.before) folder.write(name, "precious");
-        Process run(endless() + Words{"-y"}, here());
+        Process run(endless() + Words{"-y", "--filter", "rawdump:filename=dump"}, here());
         ASSERT_TRUE(run.waitFor("\"event\":\"progress\""));
         run.signal(c.signal);
         const Outcome o = run.finish();

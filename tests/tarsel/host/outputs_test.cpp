@@ -211,4 +211,27 @@ TEST_F(OutputsTest, WhatIsInTheWayIsKept) {
     EXPECT_TRUE(now == job.before || now == job.after);
 }
 
+// Each run cleans the folder when it starts; none takes the new folder of another one for one that was left.
+TEST_F(OutputsTest, RunsThatStartTogether) {
+    fill({});
+    const auto many = [&](int number) {
+        const std::string name = std::to_string(number);
+        const Job job{"", name + ".wav", "wav", {}, {{"out.wav", name}}, {}};
+        for (int i = 0; i < 200; ++i)
+            if (run(job) != 0) return 1;
+        return 0;
+    };
+    std::vector<pid_t> children;
+    for (int i = 0; i < 4; ++i) {
+        children.push_back(fork());
+        if (children.back() == 0) _exit(many(i));
+    }
+    for (const pid_t child : children) {
+        int status = 0;
+        waitpid(child, &status, 0);
+        EXPECT_EQ(status, 0);
+    }
+    EXPECT_EQ(found(), (Files{{"0.wav", "0"}, {"1.wav", "1"}, {"2.wav", "2"}, {"3.wav", "3"}}));
+}
+
 }  // namespace
