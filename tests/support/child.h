@@ -14,6 +14,7 @@
 #include <sys/prctl.h>
 #include <sys/ptrace.h>
 #include <sys/syscall.h>
+#include <sys/user.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -48,6 +49,39 @@ bool killedBefore(int n, Run run) {
     waitpid(child, &status, 0);
     return true;
 }
+
+#ifdef __x86_64__
+// Runs `run` in a child whose n-th call of this number, from 1, fails with `error`. Its exit status, or -1 if
+// there were not as many such calls.
+template <class Run>
+int withFailure(long number, int n, int error, Run run) {
+    const pid_t child = fork();
+    if (child == 0) {
+        ptrace(PTRACE_TRACEME, 0, nullptr, nullptr);
+        raise(SIGSTOP);
+        _exit(run());
+    }
+    int status = 0, seen = 0;
+    waitpid(child, &status, 0);
+    for (bool begins = true, fails = false;; begins = !begins) {
+        ptrace(PTRACE_SYSCALL, child, nullptr, nullptr);
+        waitpid(child, &status, 0);
+        if (!WIFSTOPPED(status)) break;
+        user_regs_struct registers{};
+        if (!fails && !begins) continue;
+        ptrace(PTRACE_GETREGS, child, nullptr, &registers);
+        if (begins && static_cast<long>(registers.orig_rax) == number && ++seen == n) {
+            registers.orig_rax = static_cast<unsigned long long>(-1);  // no call at all
+            fails = true;
+        } else if (!begins) {
+            registers.rax = static_cast<unsigned long long>(-error);
+            fails = false;
+        }
+        ptrace(PTRACE_SETREGS, child, nullptr, &registers);
+    }
+    return seen < n ? -1 : WIFEXITED(status) ? WEXITSTATUS(status) : 128 + WTERMSIG(status);
+}
+#endif
 
 // From now on these system calls of this process fail with `error`.
 inline void failCalls(std::initializer_list<int> numbers, int error) {

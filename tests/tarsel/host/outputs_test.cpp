@@ -190,6 +190,24 @@ TEST_F(OutputsTest, WhatTheDiskDoesNotTakeLeavesTheOld) {
             }
 }
 
+#ifdef __x86_64__
+// One call fails in the middle of a placement: the files go back.
+TEST_F(OutputsTest, OneCallThatFailsTakesAllBack) {
+    for (const auto& job : kJobs)
+        for (const long call : {SYS_fsync, SYS_renameat2}) {
+            int calls = 0;
+            for (int n = 1;; ++n, ++calls) {
+                fill(job.before);
+                const int status = withFailure(call, n, EIO, [&] { return run(job); });
+                if (status < 0) break;
+                EXPECT_EQ(status, 4) << job.what << call << ", " << n;
+                EXPECT_EQ(found(), job.before) << job.what << call << ", " << n;
+            }
+            EXPECT_GE(calls, 1) << job.what << call;
+        }
+}
+#endif
+
 TEST_F(OutputsTest, WhatIsInTheWayIsKept) {
     const Job& job = kJobs[3];
     for (int n = 1; found().count("work") == 0 || recover()[0].outcome != Leftover::Outcome::inTheWay; ++n) {

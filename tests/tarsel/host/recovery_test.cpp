@@ -104,6 +104,26 @@ TEST_F(Recovery, TheOwnerDecides) {
     EXPECT_EQ(found.at(0).bytes, 5);
 }
 
+// Its parent may wait long until it asks how it ended.
+TEST_F(Recovery, AZombieIsGone) {
+    int channel[2];
+    ASSERT_EQ(pipe(channel), 0);
+    const pid_t child = fork();
+    if (child == 0) {
+        const std::string text = Owner::self().text();
+        _exit(write(channel[1], text.data(), text.size()) < 0);
+    }
+    siginfo_t info{};
+    waitid(P_PID, static_cast<id_t>(child), &info, WEXITED | WNOWAIT);
+    char text[1024];
+    const ssize_t size = read(channel[0], text, sizeof text);
+    leave(std::string(text, static_cast<size_t>(size)));
+    EXPECT_EQ(outcome(), Outcome::removed);
+    waitpid(child, nullptr, 0);
+    close(channel[0]);
+    close(channel[1]);
+}
+
 TEST_F(Recovery, ALockProtects) {
     leave(ended().text());
     const int lock = open((work() / "owner").c_str(), O_RDWR | O_CLOEXEC);
