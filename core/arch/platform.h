@@ -35,6 +35,30 @@ struct QvFolderEntry {
     bool isFolder = false;  // also true of a symbolic link to a folder
 };
 
+// In whose hands the file of a library may be.
+enum class QvLibraryTrust {
+    // Root and this user (the effective one) own the file, each folder on the way to it and each link, and
+    // nobody else may write to them: not everybody, nor a group, except the user's private one and root's.
+    // Folders above that of the file may be open to all if they protect what is in them (the sticky bit, as
+    // /tmp has it).
+    owner,
+    anyone,
+};
+
+enum class QvLibraryFault {
+    none,
+    unreadable,  // not there, or may not be read
+    unsafe,      // in the hands of others
+    invalid,     // not a whole shared library of this machine
+    unresolved,  // the loader refuses it: something that it needs is not there
+};
+
+struct QvLibrary {
+    void* handle = nullptr;
+    QvLibraryFault fault = QvLibraryFault::none;
+    std::string reason;  // the end of a sentence that begins with the file: "is empty"
+};
+
 enum class QvFontFace { sans, sansItalic, sansBold, monospaceBold };
 
 class QV_API QvPlatform {
@@ -91,9 +115,14 @@ class QV_API QvPlatform {
 
     // --- Libraries and processes -----------------------------------------------------------------------
 
-    // A library with its dependencies, which are also looked for in its own folder, by their sonames. Null on
-    // failure, with the system's reason in `error`. Symbols stay local to the library.
-    virtual void* loadLibrary(const char* name, std::string& error);
+    // A library with its dependencies, which are also looked for in its own folder, by their sonames. The
+    // file, and dependencies from its folder, are checked before any of their code runs; a name that leads to
+    // a pipe or a device does not block. Symbols stay local to the library. The start of a library runs in
+    // this call and may end the process, also by an exception: none passes the system's loader.
+    virtual QvLibrary loadLibrary(const char* name, QvLibraryTrust trust);
+    // The value of an exported 32-bit number as the file has it, without loading the library. False if it
+    // can't be found there.
+    virtual bool libraryNumber(const char* name, const char* symbol, std::uint32_t& value);
     virtual void* findSymbol(void* library, const char* symbol);  // null if absent
     virtual void unloadLibrary(void* library);
     virtual std::string coreLibraryPath();  // full name of the file that holds the engine

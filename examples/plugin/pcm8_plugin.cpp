@@ -140,6 +140,11 @@ void addModules(QvPlugin& plugin) {
 
 }  // namespace
 
+// The engine refuses the file, with a sentence, if it has another version of the interface than this.
+extern "C" {
+QV_API unsigned qv_plugin_abi = qvPluginAbi;
+}
+
 extern "C" QV_API QvPlugin* plugin_init() {
     static QvPlugin plugin("pcm8", "Bare 8-bit sound");
     if (plugin.nrModules() == 0) addModules(plugin);

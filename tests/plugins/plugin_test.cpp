@@ -1,4 +1,10 @@
 // Plug-in files loaded by the shared library, as an application does it.
+#include <link.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cstddef>
+#include <cstdlib>
 
 #include "core/decode/decodefactory.h"
 #include "core/decode/qvdecoder.h"
@@ -17,6 +23,7 @@ namespace fs = std::filesystem;
 
 struct Plugins : testing::Test {
     Plugins() {
+        umask(022);  // a plug-in that a group may write is refused
         init_wrapper(nullptr);
         qv_dbg()->setLogger(&log);
     }
@@ -28,6 +35,7 @@ struct Plugins : testing::Test {
     std::string bring(const std::string& file, const std::string& as = "") const {
         const fs::path to = folder.path() / (as.empty() ? file : as);
         fs::copy_file(fs::path(QV_PLUGIN_FOLDER) / file, to);
+        fs::permissions(to, fs::perms{0755});  // whatever the build's are
         return to.string();
     }
     int load(const std::string& file) { return registry.loadPlugin(narrow(file)); }
@@ -74,29 +82,90 @@ TEST_F(Plugins, DecoderAndFilterDoTheirWork) {
     EXPECT_TRUE(inverted[0] == -1000 && inverted[1] == 2147483647);
 }
 
-TEST_F(Plugins, BadFilesLeaveNothingButALine) {
+TEST_F(Plugins, BadFilesLeaveALineAndAReason) {
+    const char *const failed = "Failed to load %s", *const noStart = "Loaded %s, failed to initialize";
     const struct {
-        const char *file, *line;  // line null: no error is told
+        const char *file, *line;  // line null: no error is logged
+        QvPluginFault fault;
+        const char* reason;
     } cases[] = {
-        {"noentry_plugin.so", "Loaded %s, failed to initialize"},
-        {"throwing_plugin.so", "Loaded %s, failed to initialize"},
-        {"declining_plugin.so", nullptr},
-        {"needy_plugin.so", "libqvtestdependency.so"},  // stays behind
-        {"text_plugin.so", "Failed to load %s"},
-        {"absent_plugin.so", "Failed to load %s"},
+        {"noentry_plugin.so", noStart, QvPluginFault::noEntry, "has no function plugin_init"},
+        {"throwing_plugin.so", noStart, QvPluginFault::failed, "failed in its start"},
+        {"declining_plugin.so", nullptr, QvPluginFault::declined, "declined to load"},
+        {"needy_plugin.so", failed, QvPluginFault::unresolved,  // the library is not brought along
+         "needs the library 'libqvtestdependency.so', which is not there"},
+        {"foreign_plugin.so", "%s was built for version 2", QvPluginFault::otherAbi,
+         "was built for version 2 of the plug-in interface; this engine has version 1"},
+        {"half_plugin.so", failed, QvPluginFault::invalid, "is incomplete: it ends after 5000 bytes"},
+        {"text_plugin.so", failed, QvPluginFault::invalid, "is not a shared library"},
+        {"folder_plugin.so", failed, QvPluginFault::invalid, "is a folder"},
+        {"absent_plugin.so", failed, QvPluginFault::unreadable, "does not exist"},
+        {"unreadable_plugin.so", failed, QvPluginFault::unreadable, "can't be opened: Permission denied"},
     };
     folder.write("text_plugin.so", "this is no library\n");
-    for (int i = 0; i < 4; ++i) bring(cases[i].file);
+    fs::create_directory(folder.file("folder_plugin.so"));
+    fs::resize_file(bring("pcm8_plugin.so", "half_plugin.so"), 5000);
+    fs::permissions(bring("pcm8_plugin.so", "unreadable_plugin.so"), fs::perms::none);
+    for (int i = 0; i < 5; ++i) bring(cases[i].file);
+    std::size_t failures = 0;
     for (const auto& c : cases) {
         SCOPED_TRACE(c.file);
-        log.clear();
         const std::string file = folder.file(c.file);
-        EXPECT_EQ(load(file), -2);
+        if (access(file.c_str(), R_OK) == 0 && c.file[0] == 'u') continue;  // root reads everything
+        log.clear();
+        for (int attempt = 0; attempt < 2; ++attempt) EXPECT_EQ(load(file), -2);
         EXPECT_EQ(log.count("", QvLogMask::error) > 0, c.line != nullptr);
         EXPECT_TRUE(!c.line || log.contains(Any::sprintf(c.line, file.c_str()).asString(), QvLogMask::error));
         EXPECT_FALSE(isMapped(file));
+        ASSERT_EQ(registry.pluginFailures().size(), ++failures);
+        const QvPluginFailure& failure = registry.pluginFailures().back();
+        EXPECT_TRUE(failure.file == file.c_str() && failure.fault == c.fault);
+        EXPECT_EQ(failure.reason, c.reason);
     }
     EXPECT_EQ(registry.nrPlugins(), 1);
+    // What is mended is no failure any more.
+    fs::remove(folder.file("text_plugin.so"));
+    EXPECT_EQ(load(bring("pcm8_plugin.so", "text_plugin.so")), 0);
+    EXPECT_EQ(registry.pluginFailures().size(), failures - 1);
+    EXPECT_EQ(QvRegistry::loadingPlugin(), nullptr);
+}
+
+// Found in the file before its code runs; in a file without sections, after its static constructors.
+TEST_F(Plugins, OneForAnotherEngineIsNotStarted) {
+    const std::string file = bring("foreign_plugin.so");
+    unsetenv("QV_FOREIGN_RAN");
+    EXPECT_EQ(load(file), -2);
+    EXPECT_EQ(getenv("QV_FOREIGN_RAN"), nullptr);
+
+    std::string bytes = TempFolder::read(file);
+    std::memset(&bytes[offsetof(ElfW(Ehdr), e_shoff)], 0, sizeof(ElfW(Ehdr)::e_shoff));
+    std::memset(&bytes[offsetof(ElfW(Ehdr), e_shnum)], 0, sizeof(ElfW(Ehdr)::e_shnum));
+    EXPECT_EQ(load(folder.write("bare_plugin.so", bytes)), -2);
+    EXPECT_NE(getenv("QV_FOREIGN_RAN"), nullptr);
+    ASSERT_EQ(registry.pluginFailures().size(), 2u);
+    for (const auto& failure : registry.pluginFailures()) EXPECT_EQ(failure.fault, QvPluginFault::otherAbi);
+    std::uint32_t number = 0;
+    EXPECT_TRUE(qv_platform().libraryNumber(bring("pcm8_plugin.so").c_str(), "qv_plugin_abi", number));
+    EXPECT_EQ(number, qvPluginAbi);
+    for (const char* symbol : {"qv_plugin", "qv_plugin_abi_", "plugin_init", ""})
+        EXPECT_FALSE(qv_platform().libraryNumber(file.c_str(), symbol, number)) << symbol;
+}
+
+TEST_F(Plugins, UnsafeFilesAndDependenciesAreRefusedUnlessAllowed) {
+    const fs::perms all = fs::perms::others_write;
+    const std::string file = bring("needy_plugin.so");
+    fs::permissions(bring("libqvtestdependency.so"), all, fs::perm_options::add);
+    EXPECT_EQ(load(file), -2);
+    EXPECT_EQ(registry.pluginFailures().back().reason,
+              "needs the library 'libqvtestdependency.so', which can be written to by other users");
+    fs::permissions(file, all, fs::perm_options::add);
+    EXPECT_EQ(registry.scanFolder(narrow(folder.path().string())), 0);
+    EXPECT_EQ(registry.pluginFailures().back().fault, QvPluginFault::unsafe);
+    EXPECT_EQ(registry.nrPlugins(), 1);
+    registry.setConfig(AnyDict("allow_unsafe_plugins", 1));
+    EXPECT_EQ(load(file), 0);
+    EXPECT_TRUE(registry.pluginFailures().empty());
+    registry.setConfig(AnyDict());
 }
 
 TEST_F(Plugins, ABadFileDoesNotStopTheScan) {

@@ -1,4 +1,6 @@
 // The installed tree, the examples and the documents, used as a stranger uses them.
+#include <sys/stat.h>
+
 #include "tests/system/tool.h"
 
 namespace {
@@ -8,7 +10,10 @@ using testing::HasSubstr;
 
 constexpr const char* kSources = QV_SOURCE_DIR;
 
-class Examples : public Tool {};
+class Examples : public Tool {
+  protected:
+    Examples() { umask(022); }  // a plug-in that a group may write is refused
+};
 
 TEST_F(Examples, CopySound) {
     makeWav("take.wav", 12345, 2, 24, 48000);
@@ -36,6 +41,7 @@ TEST_F(Examples, PluginThroughTheTool) {
 class Installed : public Tool {
   protected:
     Installed() {
+        umask(022);
         const Outcome o =
             runProgram({"cmake", "--install", QV_BINARY_DIR, "--prefix", folder.file("tree")}, here());
         EXPECT_EQ(o.status, 0) << o.err;

@@ -1,6 +1,13 @@
 #include <dlfcn.h>
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+#include <cerrno>
+#include <cstring>
 
 #include "core/arch/platform.h"
+#include "core/arch/posix/elffile_p.h"
+#include "core/arch/posix/trustedpath_p.h"
 
 namespace {
 
@@ -16,43 +23,119 @@ std::string missingDependency(const std::string& message) {
     return library.find('/') == std::string::npos ? library : "";
 }
 
-void* open(const std::string& name, std::string& error) {
-    void* const library = dlopen(name.c_str(), RTLD_NOW | RTLD_LOCAL);
-    if (!library) {
-        const char* const reason = dlerror();
-        error = reason ? reason : "unknown reason";
-    }
-    return library;
+// The loader's message without the file's own name, which it begins with.
+std::string reasonOf(const std::string& message, const std::string& name) {
+    const std::string missing = missingDependency(message);
+    if (!missing.empty()) return "needs the library '" + missing + "', which is not there";
+    const bool named = message.starts_with(name + ": ");
+    return "can't be loaded: " + (named ? message.substr(name.size() + 2) : message);
 }
 
-// Loads dependencies from `folder` until `name` loads or the loader complains of something else. They stay
-// loaded for as long as `name` needs them. The depth bounds dependencies that need each other.
-void* openWithFolder(const std::string& name, const std::string& folder, std::string& error, int depth) {
-    std::vector<void*> dependencies;
-    void* library = open(name, error);
-    for (std::string last; !library && depth > 0;) {
-        const std::string missing = missingDependency(error);
-        if (missing.empty() || missing == last) break;
-        last = missing;
-        std::string reason;
-        void* const dependency = openWithFolder(folder + missing, folder, reason, depth - 1);
-        if (!dependency) break;
-        dependencies.push_back(dependency);
-        library = open(name, error);
+// A file for reading; a name that leads to a pipe or a device does not block.
+class File {
+  public:
+    explicit File(const std::string& name)
+        : descriptor_(::open(name.c_str(), O_RDONLY | O_NONBLOCK | O_NOCTTY | O_CLOEXEC)) {}
+    File(const File&) = delete;
+    File& operator=(const File&) = delete;
+    ~File() {
+        if (descriptor_ >= 0) close(descriptor_);
     }
-    for (void* dependency : dependencies) dlclose(dependency);
-    return library;
+    int descriptor() const { return descriptor_; }
+    // False if it is not open, or is not a regular file.
+    bool size(std::uint64_t& bytes) const {
+        struct stat facts {};
+        if (fstat(descriptor_, &facts) != 0 || !S_ISREG(facts.st_mode)) return false;
+        bytes = static_cast<std::uint64_t>(facts.st_size);
+        return true;
+    }
+
+  private:
+    const int descriptor_;
+};
+
+QvLibrary checkContents(const std::string& name) {
+    const File file(name);
+    if (file.descriptor() < 0)
+        return {nullptr, QvLibraryFault::unreadable, std::string("can't be opened: ") + std::strerror(errno)};
+    std::uint64_t size = 0;
+    const std::string fault = file.size(size) ? qvElfFault(file.descriptor(), size) : "is not a regular file";
+    return {nullptr, fault.empty() ? QvLibraryFault::none : QvLibraryFault::invalid, fault};
 }
+
+class Loader {
+  public:
+    Loader(QvLibraryTrust trust, const std::string& name) : trust_(trust) {
+        folders_.push_back(folderOf(name));
+    }
+
+    // The file is checked and then loaded by its name, without links, right after. Loading what the check has
+    // opened, as /proc/self/fd/N, would close the moment in between, but the library would no longer know its
+    // own folder ($ORIGIN), nor the loader that it is loaded already. That moment is open only to this user
+    // and root, who could as well change the file before.
+    QvLibrary load(const std::string& name, int depth) {
+        const QvFoundFile found = qvFindLibrary(name, trust_);
+        if (found.name.empty()) return {nullptr, found.fault, found.reason};
+        QvLibrary result = checkContents(found.name);
+        if (result.fault != QvLibraryFault::none) return result;
+        if (folders_.size() == 1) folders_.push_back(folderOf(found.name));
+        return open(found.name, depth);
+    }
+
+  private:
+    // Loads dependencies from the library's folder until it loads or the loader complains of something else.
+    // They stay loaded for as long as it needs them. The depth bounds dependencies that need each other.
+    QvLibrary open(const std::string& name, int depth) {
+        std::vector<void*> dependencies;
+        QvLibrary result;
+        for (std::string last;;) {
+            result.handle = dlopen(name.c_str(), RTLD_NOW | RTLD_LOCAL);
+            if (result.handle) break;
+            const char* const message = dlerror();
+            const std::string missing = missingDependency(message ? message : "");
+            result.fault = QvLibraryFault::unresolved;
+            result.reason = reasonOf(message ? message : "unknown reason", name);
+            if (missing.empty() || missing == last || depth == 0) break;
+            last = missing;
+            void* const dependency = loadDependency(missing, depth - 1, result.reason);
+            if (!dependency) break;
+            dependencies.push_back(dependency);
+        }
+        for (void* dependency : dependencies) dlclose(dependency);
+        if (!result.handle) return result;
+        return {result.handle, QvLibraryFault::none, ""};
+    }
+
+    // From the folder of the name that was given, or of the file that it leads to.
+    void* loadDependency(const std::string& file, int depth, std::string& reason) {
+        for (const std::string& folder : folders_) {
+            const QvLibrary dependency = load(folder + file, depth);
+            if (dependency.handle) return dependency.handle;
+            if (dependency.fault == QvLibraryFault::unreadable) continue;
+            reason = "needs the library '" + file + "', which " + dependency.reason;
+            break;
+        }
+        return nullptr;
+    }
+
+    const QvLibraryTrust trust_;
+    std::vector<std::string> folders_;
+};
 
 }  // namespace
 
-void* QvPlatform::loadLibrary(const char* name, std::string& error) {
-    // Without a separator the loader would search its own folders for the name.
-    const std::string file = std::string_view(name).find('/') == std::string_view::npos
-                                 ? std::string("./") + name
-                                 : std::string(name);
+QvLibrary QvPlatform::loadLibrary(const char* name, QvLibraryTrust trust) {
     constexpr int deepest = 16;
-    return openWithFolder(file, folderOf(file), error, deepest);
+    return Loader(trust, name).load(name, deepest);
+}
+
+bool QvPlatform::libraryNumber(const char* name, const char* symbol, std::uint32_t& value) {
+    const File file(name);
+    std::uint64_t size = 0;
+    if (!file.size(size)) return false;
+    const std::optional<std::uint32_t> number = qvElfNumber(file.descriptor(), size, symbol);
+    if (number) value = *number;
+    return number.has_value();
 }
 
 void* QvPlatform::findSymbol(void* library, const char* symbol) { return dlsym(library, symbol); }

@@ -3,6 +3,7 @@
 
 #include <deque>
 #include <memory>
+#include <string>
 
 #include "core/arch/api.h"
 #include "core/value/any.h"
@@ -62,3 +63,28 @@ class QV_API QvPlugin {
 
 // What a plug-in file exports under the name "plugin_init". Null: the plug-in declines to load.
 using QvPluginInit = QvPlugin* (*)();
+
+// The number of the interface between the engine and its plug-ins. It is raised when a plug-in that was
+// compiled before no longer fits: when virtual functions or fields of public classes change. A plug-in file
+// may export the number that it was compiled with; the engine then refuses the file unless it is its own:
+//
+//     extern "C" { QV_API unsigned qv_plugin_abi = qvPluginAbi; }
+constexpr unsigned qvPluginAbi = 1;
+
+enum class QvPluginFault {
+    unreadable,  // the file is not there, or may not be read
+    unsafe,      // other users may change the file or a folder that leads to it
+    invalid,     // it is not a whole shared library of this machine
+    unresolved,  // a library or a symbol that it needs is not there
+    noEntry,     // it has no "plugin_init"
+    otherAbi,    // its "qv_plugin_abi" is not the engine's
+    failed,      // its "plugin_init" threw
+    declined,    // its "plugin_init" returned null
+};
+
+// A plug-in file that was not loaded.
+struct QvPluginFailure {
+    Any file;  // the name that was given
+    QvPluginFault fault;
+    std::string reason;  // the end of a sentence that begins with the file: "is empty"
+};

@@ -133,8 +133,14 @@ int QvRegistry::loadPlugin(const Any& file) {
         qv_dbg()->debug("[Registry] Already loaded, skipping");
         return QvStatus::ok;
     }
-    QvPlugin* plugin = qvLoadPluginFile(file);
-    if (!plugin) return QvStatus::pluginNotLoaded;
+    std::erase_if(p_->failures, [&](const QvPluginFailure& earlier) { return earlier.file == file; });
+    const QvLoadingPlugin note(name.asString(""));
+    const QvPluginLoad loaded = qvLoadPluginFile(file, config_.get("allow_unsafe_plugins").isTrue());
+    QvPlugin* const plugin = loaded.plugin;
+    if (!plugin) {
+        p_->failures.push_back({file, loaded.fault, loaded.reason});
+        return QvStatus::pluginNotLoaded;
+    }
     if (std::find(plugins_.begin(), plugins_.end(), plugin) != plugins_.end()) {
         // The same file under another name: its one plug-in is in the list.
         qvReleasePluginFile(*plugin);
@@ -151,6 +157,9 @@ int QvRegistry::loadPlugin(const Any& file) {
                     version.isTrue() ? date.asString("") : "N/A", plugin->nrModules());
     return QvStatus::ok;
 }
+
+const std::vector<QvPluginFailure>& QvRegistry::pluginFailures() const { return p_->failures; }
+const char* QvRegistry::loadingPlugin() { return QvLoadingPlugin::file(); }
 
 int QvRegistry::addPlugin(QvPlugin* plugin) {
     QV_ASSERT_MSG(plugin, "invalid ptr");
@@ -193,5 +202,6 @@ void QvRegistry::unload(QvPlugin* plugin) {
 
 void QvRegistry::cleanup() {
     while (!plugins_.empty()) unload(plugins_.front());
+    p_->failures.clear();
     qv_dbg()->setLogger(nullptr);
 }

@@ -3,6 +3,7 @@
 
 #include <deque>
 #include <memory>
+#include <vector>
 
 #include "core/arch/api.h"
 #include "core/value/any.h"
@@ -13,6 +14,7 @@ class QvLogBase;
 class QvModule;
 class QvPlugin;
 class QvPresetMgr;
+struct QvPluginFailure;
 class QvRegistry_p;
 
 // Input and output operations that an application lends to decoders; what the words mean is between the two.
@@ -33,8 +35,8 @@ class QV_API QvRegistry {
     QvRegistry& operator=(const QvRegistry&) = delete;
     ~QvRegistry();
 
-    // --- Configuration. Keys: "temp_dir", "userSettingsDir", "disable_exceptions", and those that
-    // init_wrapper reads ("logfile", "log_callback").
+    // --- Configuration. Keys: "temp_dir", "userSettingsDir", "disable_exceptions", "allow_unsafe_plugins",
+    // and those that init_wrapper reads ("logfile", "log_callback").
     void setConfig(AnyDict config);
     AnyDict config() const;
     Any tempDir() const;  // "temp_dir", or the system's
@@ -63,8 +65,20 @@ class QV_API QvRegistry {
     // false, and updates the presets. A file that fails is logged and passed over. 0, or -1 if the folder has
     // no plug-in file.
     int scanFolder(const Any& folder);
-    // Loads one file, once. 0, or QvStatus::pluginNotLoaded with the reason in the debug log.
+    // Loads one file, once. 0, or QvStatus::pluginNotLoaded with the reason in the debug log and in
+    // pluginFailures. A file that other users may change is refused unless the configuration has
+    // "allow_unsafe_plugins" true: neither they nor a group with other members may write to the file, its
+    // folder or the folders above, and all of these belong to root or this user. A folder above the file's
+    // own may be open to all if it protects what is in it, as /tmp does.
     int loadPlugin(const Any& file);
+    // The files that could not be loaded since the last cleanup, in the order of the attempts; a file that
+    // was loaded later is not among them. Valid until the next loadPlugin, scanFolder or cleanup.
+    const std::vector<QvPluginFailure>& pluginFailures() const;
+    // The file that loadPlugin is loading at this moment, or null. A plug-in can end the process while it
+    // starts, by a crash, an exit or an exception from a static constructor (which ends in std::terminate).
+    // The library installs no handlers; an application that does can name the culprit. Safe in handlers of
+    // signals, std::terminate and exit. The text is valid during the handler.
+    static const char* loadingPlugin();
     // Adds a plug-in that is in memory already; it must outlive its stay in the list. 0.
     int addPlugin(QvPlugin* plugin);
     int nrPlugins() const;

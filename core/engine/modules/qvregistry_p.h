@@ -1,7 +1,10 @@
 // The private part of the registry.
 #pragma once
 
+#include <vector>
+
 #include "core/engine/modules/presethook_p.h"
+#include "core/engine/modules/qvplugin.h"
 #include "core/engine/modules/qvregistry.h"
 
 class QvRegistry_p {
@@ -9,4 +12,5 @@ class QvRegistry_p {
     AnyDict options;  // the debug options, under "dbgOpts"
     QvPresetHook::Catalogue presets = qvPresetHook().make();
     QvExternalIO externalIO;
+    std::vector<QvPluginFailure> failures;  // plug-in files that were not loaded
 };
