@@ -10,6 +10,7 @@
 #include "tarsel/commands/commands.h"
 #include "tarsel/host/console.h"
 #include "tarsel/host/outputs.h"
+#include "tarsel/host/plugins.h"
 #include "tarsel/host/signals.h"
 #include "tarsel/host/terminal.h"
 #include "tarsel/words/commandline.h"
@@ -20,14 +21,14 @@ namespace {
 // The engine, from the first command to the end of the program.
 class Engine {
   public:
-    Engine(const std::string& log, const std::string& plugins) {
+    Engine(const std::string& log, const std::string& plugins, bool allowUnsafe) {
         AnyDict config;
         if (!log.empty()) config.set("logfile", log.c_str());
+        if (allowUnsafe) config.set("allow_unsafe_plugins", 1);
         init_wrapper(&config);
         qv_registry()->addPlugin(qvSubtitlePlugin());
         pluginsLoaded_ = !plugins.empty();
-        if (pluginsLoaded_ && qv_registry()->scanFolder(Any(plugins.c_str())) != QvStatus::ok)
-            std::fprintf(stderr, "tarsel: warning: no plug-ins in %s\n", inQuotes(plugins).c_str());
+        if (pluginsLoaded_) loadPlugins(plugins);
         qvPresetMgr()->update();
     }
     ~Engine() {
@@ -53,8 +54,10 @@ int run(int argc, char** argv) {
     CommandLine line("Transcodes, inspects and draws media from the command line.",
                      std::string("tarsel ") + QvUtil::libraryVersion().asString());
     std::string log, plugins;
+    bool allowUnsafePlugins = false;
     line.option("--log", log, "Write the engine's log to FILE, or to stderr", "FILE", nullptr);
     line.option("--plugins", plugins, "Load the plug-ins of FOLDER", "FOLDER", "TARSEL_PLUGINS");
+    line.flag("--allow-unsafe-plugins", allowUnsafePlugins, "Load plug-ins that other users may change, too");
     addTranscode(line, signals);
     addInfo(line);
     addCaptions(line);
@@ -69,7 +72,7 @@ int run(int argc, char** argv) {
         flushOutput();
         return status(Exit::done);
     }
-    Engine engine(log, plugins);
+    Engine engine(log, plugins, allowUnsafePlugins);
     parsed.action();
     flushOutput();
     return status(Exit::done);
@@ -77,6 +80,7 @@ int run(int argc, char** argv) {
 
 // Where memory is so short that not even the way out has enough, nothing half-done may stay behind.
 [[noreturn]] void breakOff() {
+    blameLoadingPlugin("an exception left its start");
     const bool abandoned = Outputs::abandonAll();
     const char* reason = "tarsel: an internal error";
     try {

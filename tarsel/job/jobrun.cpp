@@ -7,6 +7,7 @@
 #include <optional>
 
 #include "tarsel/host/keyboard.h"
+#include "tarsel/host/plugins.h"
 #include "tarsel/job/job.h"
 #include "tarsel/job/post.h"
 #include "tarsel/words/timespec.h"
@@ -270,9 +271,8 @@ void Job::report(const std::vector<std::string>& names) const {
     for (const JobStream& s : streams_)
         line += ", " + std::to_string(s.written) + (s.type == 1 ? " frame" : " sample") +
                 (s.written == 1 ? "" : "s");
-    if (!warnings_.empty())
-        line +=
-            " (" + std::to_string(warnings_.size()) + (warnings_.size() == 1 ? " warning)" : " warnings)");
+    const std::size_t warnings = warnings_.size() + static_cast<std::size_t>(pluginWarnings());
+    if (warnings > 0) line += " (" + std::to_string(warnings) + (warnings == 1 ? " warning)" : " warnings)");
     std::fprintf(stderr, "tarsel: %s\n", line.c_str());
 }
 

@@ -119,6 +119,8 @@ void CommandLine::option(const char* names, std::string& to, const char* help, c
     if (variable) option->envname(variable);
 }
 
+void CommandLine::flag(const char* names, bool& to, const char* help) { app_->add_flag(names, to, help); }
+
 Command CommandLine::command(const char* name, const char* help) {
     Command made(*app_->add_subcommand(name, help));
     made.chosen_ = &chosen_;

@@ -56,6 +56,7 @@ class CommandLine {
 
     // Of the tool itself, before the command; `variable` is the environment's, or null.
     void option(const char* names, std::string& to, const char* help, const char* type, const char* variable);
+    void flag(const char* names, bool& to, const char* help);
     Command command(const char* name, const char* help);
 
     struct Parsed {

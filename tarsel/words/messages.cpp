@@ -27,6 +27,16 @@ constexpr Message kMessages[] = {
     {Msg::recoverNoFolder,    Exit::usage,  "can't recover {file}", "{system}", "give the folder that the outputs are in"},
     {Msg::recoverUnfinished,  Exit::failed, "can't recover all of {file}", "{text} stayed", "do what the lines before say"},
     {Msg::staleNoAge,         Exit::usage,  "can't use --stale {name}", "this is no age",             "use 90s, 90m, 12h, 30d or never"},
+
+    // plug-ins; the first ones are warnings, and the engine's reason ends a sentence that begins with the file
+    {Msg::pluginsAbsent,      Exit::module, "no plug-ins were loaded from {file}",    "no file '*_plugin.so' was found there", "check the folder's name"},
+    {Msg::pluginUnreadable,   Exit::module, "the plug-in {file} was not loaded",      "it {system}", "check the file and its permissions, or remove it"},
+    {Msg::pluginUnsafe,       Exit::module, "the plug-in {file} was not loaded",      "it {system}", "keep plug-ins where only you and root may write, or use --allow-unsafe-plugins"},
+    {Msg::pluginInvalid,      Exit::module, "the plug-in {file} was not loaded",      "it {system}", "replace it by a whole one for this machine, or remove it"},
+    {Msg::pluginUnresolved,   Exit::module, "the plug-in {file} was not loaded",      "it {system}", "install what it needs, or remove it"},
+    {Msg::pluginUnfit,        Exit::module, "the plug-in {file} was not loaded",      "it {system}", "get a version of it that was built for this engine, or remove it"},
+    {Msg::pluginFailed,       Exit::module, "the plug-in {file} was not loaded",      "it {system}", "ask its maker, or remove it"},
+    {Msg::pluginEndedAll,     Exit::module, "the plug-in {file} ended the program while it was loaded", "{text}", "remove it, or get another version of it"},
 };
 // clang-format on
 

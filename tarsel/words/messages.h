@@ -29,6 +29,15 @@ enum class Msg : unsigned char {
     recoverNoFolder,
     recoverUnfinished,
     staleNoAge,
+    // plug-ins
+    pluginsAbsent,
+    pluginUnreadable,
+    pluginUnsafe,
+    pluginInvalid,
+    pluginUnresolved,
+    pluginUnfit,
+    pluginFailed,
+    pluginEndedAll,
     count,  // of messages, none itself
 };
 
