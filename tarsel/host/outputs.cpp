@@ -168,7 +168,8 @@ std::string Outputs::hiddenName(const std::string& extension) const {
 std::string Outputs::begin(const std::string& extension) {
     // What is written to a device or a pipe goes straight there, by a link in a folder elsewhere.
     const fs::path where = device_ ? fs::temp_directory_path() : folderOf(set_ ? output_ : target_);
-    if (device_) putInOrder(where);
+    // Nothing of a user's lies there, so there is nothing to say of it.
+    if (device_ && policy_.recover) recoverPlace(where.string(), {.stale = policy_.stale, .sync = false});
     {
         std::lock_guard guard(lock_);
         if (const int error = work_.make(where.string())) refuse(output_, inLine(std::strerror(error)));

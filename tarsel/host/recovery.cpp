@@ -56,8 +56,6 @@ class Visit {
         }
         if (status.st_uid != geteuid() || (status.st_mode & (S_IWGRP | S_IWOTH)) != 0)
             return as(Outcome::notOurs);
-        // An end right after it was made. A run that is about to put its owner there makes another one.
-        if (unlinkat(place_, found_.folder.c_str(), AT_REMOVEDIR) == 0) return as(Outcome::removed);
         if (!lock()) return found_;
         if (gone_) return std::nullopt;
         return finish();
@@ -70,10 +68,22 @@ class Visit {
         return found_;
     }
 
-    // True if the folder may be taken; otherwise `found_` says why not.
+    // Opens the owner. Where there is none yet or any more the folder is empty, and is removed: a run that is
+    // about to put its owner there makes another one.
+    bool openOwner() {
+        const auto open = [&] {
+            owner_.reset(
+                openat(folder_.get(), WorkFolder::kOwner, O_RDWR | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC));
+            return static_cast<bool>(owner_);
+        };
+        if (open()) return true;
+        gone_ = unlinkat(place_, found_.folder.c_str(), AT_REMOVEDIR) == 0 || errno == ENOENT;
+        return !gone_ && open();
+    }
+
+    // True if the folder may be taken, or is gone; otherwise `found_` says why not.
     bool lock() {
-        owner_.reset(openat(folder_.get(), WorkFolder::kOwner, O_RDWR | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC));
-        if (!owner_) return maySeize(Outcome::ownerless, "");
+        if (!openOwner()) return gone_ || maySeize(Outcome::ownerless, "");
         if (flock(owner_.get(), LOCK_EX | LOCK_NB) != 0 && errno == EWOULDBLOCK) {
             as(Outcome::inUse);
             return false;
