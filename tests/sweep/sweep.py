@@ -1,217 +1,154 @@
 #!/usr/bin/env python3
-"""Fails every n-th allocation and file operation of small jobs of the tool, one run each.
+"""Attacks the tool: calls that fail, signals, kills, hostile inputs, absurd options, blocked outputs, rogue plug-ins.
 
-    tests/sweep/sweep.py build/release [--job NAME] [--kind NAME] [--from N] [--every N] [--jobs N]
+    tests/sweep/sweep.py build/release [--quick | --all] [--kind K]... [--job J] [--case NAME] [--seed N]
 
-Each run is an error that is told, with the old outputs as they were, or a success with the right bytes. A crash, a
-hang, a file that is left over, a success with other bytes and an output that is neither old nor right are faults.
-A kind has been swept when a run passes without meeting the call that would have failed.
-
-A build with the address sanitizer tells of stray accesses and of leaks as well; it is slow, so give it --every 20.
+Every run has to end as it should: with status 0 and the right bytes, or with an error that is told in one line and the
+old outputs unchanged. A crash, a hang, a torn or mixed result, a success with other bytes, a file left over and a
+message that shows the inside are faults. Each fault is printed with a command that repeats it. The status is 1 if
+there is one. See docs/hacking.md, and the comment of each attack's unit.
 """
 import argparse
 import collections
 import concurrent.futures
 import os
 import pathlib
-import re
-import struct
+import random
 import subprocess
 import sys
 import tempfile
 import time
 
+import faults
+import hostile
+import jobs
+import kills
+import limits
+import options
+import outputs
+import perturb
+import plugins
+import readers
+import signals
+from runner import Sweep
+
 HERE = pathlib.Path(__file__).resolve().parent
-OLD = b"what was there before\n"
-PATIENCE = 60  # seconds
-
-# How calls of a kind fail, and whether only one does or all from there on.
-WAYS = {
-    "alloc": [("enomem", False), ("enomem", True)],
-    "open": [("eio", False), ("eio", True)],
-    "read": [("eio", False), ("eio", True), ("short", False)],
-    "write": [("eio", False), ("enospc", False), ("enospc", True), ("short", False)],
-    "close": [("eio", False), ("enospc", True)],
-    "rename": [("eio", False), ("eio", True)],
+ATTACKS = {  # kind: the unit that has its cases, and how many of them --quick runs
+    "reader": (readers, 1000), "perturb": (perturb, 12),
+    "alloc": (faults, 220), "open": (faults, 15), "read": (faults, 20), "write": (faults, 30), "close": (faults, 15),
+    "rename": (faults, 20), "sync": (faults, 20), "thread": (faults, 15), "make": (faults, 10), "lock": (faults, 10),
+    "kill": (kills, 60), "signal": (signals, 40), "hostile": (hostile, 100), "option": (options, 60),
+    "output": (outputs, 1000), "limit": (limits, 20), "plugin": (plugins, 1000),
 }
 
-RAW = ["--raw", "size=64x48,pixel=I420,rate=25"]
-JOBS = {  # arguments, outputs
-    "sound": (["transcode", "in.wav", "-o", "out.wav", "-y"], ["out.wav"]),
-    "cut": (["transcode", "clip.yuv", *RAW, "--from", "0.2", "--to", "0.6", "-o", "part.yuv", "-y"], ["part.yuv"]),
-    "card": (["transcode", "testgen:size=64x64,duration=0.4", "-o", "card.raw", "-y"], ["card.raw", "card.wav"]),
-    "picture": (["frame", "clip.yuv", *RAW, "--at", "0.2", "-o", "shot.png", "-y"], ["shot.png"]),
-}
 
-Outcome = collections.namedtuple("Outcome", "status text counted outputs extra")
-
-
-def pattern(count):
-    return bytes((i * 7 + i // 251) & 255 for i in range(count))
+def build_helpers(to):
+    """The library that makes calls fail, and the tracer that kills."""
+    to.mkdir(parents=True, exist_ok=True)
+    compiler = os.environ.get("CXX", "c++")
+    made = to / "shim.so", to / "killat"
+    for source, target, flags in (("shim.cpp", made[0], ["-fPIC", "-shared"]), ("killat.cpp", made[1], [])):
+        if not target.exists() or target.stat().st_mtime < (HERE / source).stat().st_mtime:
+            subprocess.run([compiler, "-std=c++20", "-O1", "-Wall", "-Wextra", *flags, HERE / source, "-o", target,
+                            "-ldl"], check=True)
+    return tuple(map(str, made))
 
 
-def make_inputs():
-    data = pattern(12000)
-    head = b"fmt " + struct.pack("<IHHIIHH", 16, 1, 2, 44100, 176400, 4, 16) + b"data" + struct.pack("<I", len(data))
-    return {"in.wav": b"RIFF" + struct.pack("<I", 4 + len(head) + len(data)) + b"WAVE" + head + data,
-            "clip.yuv": pattern(64 * 48 * 3 // 2 * 20)}
+def chosen_cases(sweep, pool, wanted):
+    """The cases of the wanted kinds, in quick runs a seeded part of each kind; one by its name if there is one."""
+    chosen = sweep.options
+    for unit in dict.fromkeys(ATTACKS[kind][0] for kind in wanted):
+        rng = random.Random(chosen.seed)
+        found = collections.defaultdict(list)
+        for kind, name, run in unit.cases(sweep, pool, rng):
+            if kind in wanted and chosen.case in (None, f"{kind}/{name}"):
+                found[kind].append((kind, name, run))
+        for kind, cases in found.items():
+            most = ATTACKS[kind][1] if chosen.quick else len(cases)
+            keep = set(rng.sample(range(len(cases)), min(most, len(cases))))
+            yield from (case for i, case in enumerate(cases) if i in keep)
 
 
-def content(name):
+def guarded(case):
     try:
-        with open(name, "rb") as file:
-            return file.read()
-    except OSError:
-        return None
+        return case[2]()
+    except Exception as failure:  # of the attack itself
+        return "error", f"the attack failed: {failure!r}", None
 
 
-class Runner:
-    """Runs jobs in a folder of its own; one in each process of the pool."""
+class Report:
+    def __init__(self, chosen):
+        self.chosen = chosen
+        self.runs, self.ok, self.failed, self.faults, self.seconds = (collections.Counter() for _ in range(5))
 
-    def __init__(self, tool, shim, scratch):
-        self.tool, self.inputs = tool, make_inputs()
-        self.preload = shim
-        if "libasan" in subprocess.run(["ldd", tool], capture_output=True, text=True, check=True).stdout:
-            asan = subprocess.run([os.environ.get("CC", "cc"), "-print-file-name=libasan.so"], capture_output=True,
-                                  text=True, check=True).stdout.strip()
-            self.preload = f"{shim}:{os.path.realpath(asan)}"
-        folder = tempfile.mkdtemp(dir=scratch)
-        self.temporary, self.report = folder + ".tmp", folder + ".report"
-        os.mkdir(self.temporary)
-        os.chdir(folder)
-        for name, data in self.inputs.items():
-            pathlib.Path(name).write_bytes(data)
+    def add(self, kind, name, ended, wrong, outcome):
+        self.runs[kind] += 1
+        if wrong:
+            self.faults[kind] += 1
+            if self.faults[kind] <= self.chosen.show:
+                again = f"./dev sweep {'--asan ' if self.chosen.asan else ''}--seed {self.chosen.seed}"
+                print(f"FAULT {kind}/{name}: {wrong}\n      {again} --case '{kind}/{name}'", flush=True)
+                if outcome:
+                    print(f"      {outcome.command}", flush=True)
+        elif ended in ("ok", "not met"):
+            self.ok[kind] += 1
+        else:
+            self.failed[kind] += 1
+        if self.chosen.case and outcome:
+            print(f"status {outcome.status}\n{outcome.text}", end="")
 
-    def run(self, job, old, sweep):
-        """One run; `sweep` are the variables of the shim."""
-        arguments, outputs = JOBS[job]
-        for name in outputs if old else []:
-            pathlib.Path(name).write_bytes(OLD)
-        environment = {"PATH": os.environ["PATH"], "HOME": self.temporary, "TMPDIR": self.temporary,
-                       "LD_PRELOAD": self.preload, "SWEEP_REPORT": self.report,
-                       "ASAN_OPTIONS": "verify_asan_link_order=0:allocator_may_return_null=1"}
-        environment.update({"SWEEP_" + key.upper(): str(value) for key, value in sweep.items()})
-        try:
-            done = subprocess.run([self.tool, *arguments], env=environment, timeout=PATIENCE, close_fds=False,
-                                  stdin=subprocess.DEVNULL, stdout=subprocess.DEVNULL, stderr=subprocess.PIPE)
-            status, text = done.returncode, done.stderr.decode(errors="replace")
-        except subprocess.TimeoutExpired:
-            status, text = "hang", ""
-        counted = (content(self.report) or b"").decode()
-        found = {name: content(name) for name in outputs}
-        extra = sorted(set(os.listdir()) - set(self.inputs) - set(outputs))
-        extra += [name for name in os.listdir(self.temporary) if name.startswith(".tarsel")]
-        for name in outputs + extra + [self.report]:
-            subprocess.run(["rm", "-rf", name]) if os.path.isdir(name) else pathlib.Path(name).unlink(missing_ok=True)
-        return Outcome(status, text, counted, found, extra)
+    def table(self):
+        lines = [f"{'kind':10}{'runs':>8}{'ok':>8}{'failed as they should':>24}{'faults':>8}"]
+        for kind in [*self.runs, "all"]:
+            cells = [c.total() if kind == "all" else c[kind] for c in (self.runs, self.ok, self.failed, self.faults)]
+            lines.append("{:10}{:8}{:8}{:24}{:8}".format(kind, *cells))
+        return "\n".join(lines)
 
 
-runner = None
-
-
-def start_runner(*arguments):
-    global runner
-    runner = Runner(*arguments)
-
-
-def run(job, old=False, **sweep):
-    return runner.run(job, old, sweep)
-
-
-def fault(outcome, right):
-    if outcome.status == "hang":
-        return "hangs"
-    if outcome.status < 0 or outcome.status >= 126 or "Sanitizer" in outcome.text or "runtime error" in outcome.text:
-        return f"crashes ({outcome.status}): {outcome.text.strip()}"
-    if outcome.extra:
-        return f"leaves {outcome.extra}"
-    for name, data in outcome.outputs.items():
-        if outcome.status == 0 and data != right[name]:
-            return f"says it is done, but {name} is " + ("absent" if data is None else "wrong")
-        if outcome.status != 0 and data not in (OLD, right[name]):
-            return f"fails and leaves {name} " + ("absent" if data is None else "partial")
-    if outcome.status != 0 and "tarsel: " not in outcome.text:
-        return f"fails without a word (status {outcome.status})"
-    return None
-
-
-def one(job, right, n, sweep):
-    """How the run ended that had the n-th call fail, and what was wrong; None when it passed untouched."""
-    outcome = run(job, True, n=n, **sweep)
-    return ("ok" if outcome.status == 0 else outcome.status, fault(outcome, right)) if outcome.counted else None
-
-
-def sweep_kind(pool, job, right, numbers, sweep):
-    """Pairs of each call that failed and what `one` says, until a run passes untouched."""
-    pending = collections.deque()
-    for n in numbers:
-        pending.append((n, pool.submit(one, job, right, n, sweep)))
-        if len(pending) < 40:
-            continue
-        n, result = pending.popleft()
-        if result.result() is None:
-            break
-        yield n, result.result()
-    for n, result in pending:
-        if result.result() is not None:
-            yield n, result.result()
-
-
-def demangled(trace):
-    functions = re.findall(r"\((\w+)\+", trace)
-    return subprocess.run(["c++filt"], input="\n".join("        " + name for name in functions), capture_output=True,
-                          text=True, check=True).stdout
-
-
-def build_shim(scratch):
-    shim = scratch / "shim.so"
-    subprocess.run([os.environ.get("CXX", "c++"), "-O1", "-fPIC", "-shared", "-Wall", "-Wextra",
-                    HERE / "shim.cpp", "-o", shim, "-ldl"], check=True)
-    return shim
+def arguments():
+    parser = argparse.ArgumentParser(description=__doc__.splitlines()[0])
+    parser.add_argument("build", help="folder of the build, or the tool itself")
+    parser.add_argument("--quick", action="store_true", help="a seeded part of each kind: about one minute")
+    parser.add_argument("--all", action="store_true", help="every call of every stack, and every system call")
+    parser.add_argument("--kind", action="append", choices=ATTACKS, help="only this kind; may be repeated")
+    parser.add_argument("--job", choices=[job.name for job in jobs.JOBS], help="only this job")
+    parser.add_argument("--case", help="only the case of this name, with what the tool says")
+    parser.add_argument("--seed", type=int, default=1)
+    parser.add_argument("--sample", type=int, default=600, help="calls beyond the first of each stack (600)")
+    parser.add_argument("--show", type=int, default=8, help="faults of a kind that are printed one by one (8)")
+    parser.add_argument("--trace", action="store_true", help="print as well what called")
+    parser.add_argument("--asan", action="store_true", help="the build has the address sanitizer")
+    parser.add_argument("--jobs", type=int, default=os.cpu_count(), help="runs at a time")
+    chosen = parser.parse_args()
+    if chosen.case:
+        chosen.kind = [chosen.case.split("/")[0]]
+        named = chosen.case.split("/")[1]
+        chosen.job = chosen.job or (named if chosen.kind[0] in ("kill", "signal") else None)
+    return chosen
 
 
 def main():
-    parser = argparse.ArgumentParser(description=__doc__.splitlines()[0])
-    parser.add_argument("build")
-    parser.add_argument("--job", choices=JOBS)
-    parser.add_argument("--kind", choices=WAYS)
-    parser.add_argument("--from", type=int, default=1, dest="first", help="the first call that fails")
-    parser.add_argument("--every", type=int, default=1, help="only each N-th call of those beyond the first 100")
-    parser.add_argument("--show", type=int, default=5, help="faults of a kind that are told one by one")
-    parser.add_argument("--trace", action="store_true", help="tell as well what called")
-    parser.add_argument("--jobs", type=int, default=os.cpu_count())
-    options = parser.parse_args()
-    total, faults, started = 0, 0, time.monotonic()
-    with tempfile.TemporaryDirectory(prefix="tarsel-sweep-") as folder:
-        scratch = pathlib.Path(folder)
-        tool = str((pathlib.Path(options.build) / "bin" / "tarsel").resolve())
-        with concurrent.futures.ProcessPoolExecutor(
-                options.jobs, initializer=start_runner, initargs=(tool, str(build_shim(scratch)), folder)) as pool:
-            for job in [options.job] if options.job else JOBS:
-                reference = pool.submit(run, job).result()
-                if reference.status != 0:
-                    sys.exit(f"the job {job} fails by itself: {reference.text}")
-                for kind in [options.kind] if options.kind else WAYS:
-                    for how, ever in WAYS[kind]:
-                        numbers = (n for n in range(options.first, 1_000_000)
-                                   if n <= 100 or (n - options.first) % options.every == 0)
-                        sweep = {"kind": kind, "how": how} | ({"ever": 1} if ever else {})
-                        ended, bad = collections.Counter(), []
-                        for n, (status, wrong) in sweep_kind(pool, job, reference.outputs, numbers, sweep):
-                            ended[status] += 1
-                            bad += [(n, wrong)] if wrong else []
-                        total += ended.total()
-                        faults += len(bad)
-                        shown = ", ".join(f"{count} with {status}" for status, count in sorted(ended.items(), key=str))
-                        print(f"{job:8} {kind:7} {how:7}{'ever' if ever else 'once':5} {ended.total():6} failed: "
-                              f"{shown}; {len(bad)} faults", flush=True)
-                        for n, wrong in bad[:options.show]:
-                            print(f"    n={n}: {wrong}", flush=True)
-                            if options.trace:
-                                traced = pool.submit(run, job, True, n=n, trace=1, **sweep).result()
-                                print(demangled(traced.counted), flush=True)
-    print(f"{total} runs in {time.monotonic() - started:.0f} s, {faults} faults")
-    return 1 if faults else 0
+    chosen = arguments()
+    build, started = pathlib.Path(chosen.build).resolve(), time.monotonic()
+    tool, built = (build, None) if build.is_file() else (build / "bin" / "tarsel", build / "sweep")
+    memory = "/dev/shm" if os.access("/dev/shm", os.W_OK) else None  # syncs are quick there
+    with tempfile.TemporaryDirectory(prefix="tarsel-sweep-", dir=memory) as folder, \
+            concurrent.futures.ThreadPoolExecutor(chosen.jobs) as pool:
+        sweep = Sweep(tool, folder, build_helpers(built or pathlib.Path(folder) / "helpers"), chosen)
+        sweep.refer()
+        report = Report(chosen)
+        pending = collections.deque()
+        for case in chosen_cases(sweep, pool, chosen.kind or list(ATTACKS)):
+            pending.append((case, pool.submit(guarded, case)))
+            while len(pending) > 4 * chosen.jobs:
+                case, result = pending.popleft()
+                report.add(*case[:2], *result.result())
+        for case, result in pending:
+            report.add(*case[:2], *result.result())
+    print(report.table())
+    print(f"{report.runs.total()} runs in {time.monotonic() - started:.0f} s, seed {chosen.seed}: "
+          f"{report.faults.total()} faults")
+    return 1 if report.faults or not report.runs else 0
 
 
 if __name__ == "__main__":

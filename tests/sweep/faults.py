@@ -1,0 +1,95 @@
+"""Calls of the C library that fail: memory, files, syncs, renames, locks, folders, thread starts.
+
+A recording run of each job lists the call stacks. One call of each distinct stack that allocates fails, once over all
+jobs, then a seeded sample of the others. Of all other kinds each job has the first, the middle and the last call of
+each stack fail, in each way that there is.
+"""
+import collections
+import os
+import pathlib
+import re
+import subprocess
+
+import kills
+from runner import Box, crashed, judged, wording
+
+# How calls of a kind fail, and whether only one does or all from there on.
+WAYS = {
+    "alloc": [("enomem", False), ("enomem", True)],
+    "open": [("eio", False), ("eio", True)],
+    "read": [("eio", False), ("eio", True), ("short", False)],
+    "write": [("eio", False), ("enospc", False), ("enospc", True), ("short", False)],
+    "close": [("eio", False), ("enospc", True)],
+    "rename": [("eio", False), ("eio", True)],
+    "sync": [("eio", False), ("enospc", True)],
+    "thread": [("eagain", False), ("eagain", True)],
+    "make": [("enospc", False), ("eio", True)],
+    "lock": [("enolck", False), ("enolck", True)],
+}
+
+
+def preload(sweep, box):
+    libraries = [sweep.shim]
+    if "libasan" in subprocess.run(["ldd", sweep.tool], capture_output=True, text=True).stdout:
+        asan = subprocess.run([os.environ.get("CC", "cc"), "-print-file-name=libasan.so"], capture_output=True, text=True)
+        libraries.append(os.path.realpath(asan.stdout.strip()))
+    return {"LD_PRELOAD": ":".join(libraries), "SWEEP_REPORT": box.root / "report"}
+
+
+def calls(sweep, job):
+    """How often each call stack of a job makes a call: {(kind, site, stack): count}, in the order of the run."""
+    with Box(sweep) as box:
+        box.lay(sweep.old[job.name])
+        sweep.completed(box.run(job.arguments, {**preload(sweep, box), "SWEEP_RECORD": 1}), job)
+        return collections.Counter(tuple(line.split()) for line in (box.root / "report").read_text().splitlines())
+
+
+def attack(sweep, job, call, nth, way, trace=False):
+    kind, site, stack = call
+    how, ever = way
+    with Box(sweep) as box:
+        box.lay(sweep.old[job.name])
+        variables = {"SWEEP_KIND": kind, "SWEEP_SITE": site, "SWEEP_STACK": stack, "SWEEP_NTH": nth, "SWEEP_HOW": how}
+        variables |= ({"SWEEP_EVER": 1} if ever else {}) | ({"SWEEP_TRACE": 1} if trace else {})
+        outcome = box.run(job.arguments, {**preload(sweep, box), **variables})
+        report = pathlib.Path(box.root / "report").read_text()
+        if kind == "rename" and ever and crashed(outcome) is None and box.litter():
+            # Not even the way back can be taken: as after a kill, nothing is mixed, and the next run completes it.
+            wrong = kills.mixed(box.files(), sweep.old[job.name], sweep.new[job.name], job.loose)
+            wrong = wrong or kills.after(box, sweep, job, "again") or wording(outcome)
+        else:
+            wrong = judged(box, outcome, job)
+        if not report and outcome.status == 0:
+            return "not met", wrong, outcome
+        if trace and wrong:
+            wrong += "\n" + called(report)
+        return outcome.ended(), wrong, outcome
+
+
+def called(report):
+    names = re.findall(r"\((\w+)\+", report)
+    return subprocess.run(["c++filt"], input="\n".join("        " + name for name in names), capture_output=True,
+                          text=True).stdout
+
+
+def cases(sweep, pool, rng):
+    seen, more = set(), []
+    recorded = list(pool.map(lambda job: calls(sweep, job), sweep.jobs))
+    for job, counted in zip(sweep.jobs, recorded):
+        for call, count in counted.items():
+            kind = call[0]
+            if kind == "alloc":
+                distinct = call not in seen
+                seen.add(call)
+                picks = [(1, way, distinct and not way[1]) for way in WAYS[kind]]
+                picks += [(nth, WAYS[kind][0], False) for nth in sorted({2, (count + 1) // 2, count} - {1}) if nth <= count]
+            else:
+                picks = [(nth, way, True) for nth in sorted({1, (count + 1) // 2, count}) for way in WAYS[kind]]
+            for nth, way, first in picks:
+                name = f"{job.name}/{call[2]}-{nth}-{way[0]}{'-ever' if way[1] else ''}"
+                case = (kind, name, lambda a=(sweep, job, call, nth, way, sweep.options.trace): attack(*a))
+                if first:
+                    yield case
+                else:
+                    more.append(case)
+    yield from more if sweep.options.all else rng.sample(more, min(len(more), sweep.options.sample))

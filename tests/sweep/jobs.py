@@ -1,0 +1,76 @@
+"""The jobs that are attacked, one for each form of output, and the inputs that they read.
+
+A job overwrites what an earlier run of it wrote. The earlier run has other arguments, so that each of its files
+differs from the new one of that name, and where the output is a set of files it has written more of them.
+"""
+import dataclasses
+import struct
+import zlib
+
+
+@dataclasses.dataclass(frozen=True)
+class Job:
+    name: str
+    arguments: list
+    earlier: list = dataclasses.field(default_factory=list)
+    loose: tuple = ()  # files that are written before the outputs: whole, but on their own
+    stdout: bool = False  # the result is what is printed
+
+
+def card(*arguments, length=0.2, size="64x48"):
+    return ["transcode", f"testgen:size={size},duration={length}", *arguments, "-y"]
+
+
+RAW = ["--raw", "size=64x48,pixel=I420,rate=25"]
+CLIP = ["clip.yuv", *RAW]
+EFFECTS = ["--subtitles", "talk.srt", "--logo", "mark.png@4,4", "--timecode", "--fade", "0.1", "--crop", "60x40", "--flip"]
+
+JOBS = [
+    Job("wav", ["transcode", "in.wav", "-o", "out.wav", "-y"], ["transcode", "in3.wav", "-o", "out.wav", "-y"]),
+    Job("raw", card("--pixel", "I420", "-o", "card.yuv"), card("--pixel", "I420", "-o", "card.yuv", length=0.28)),
+    Job("cut", ["transcode", *CLIP, "--from", "0.2", "--to", "0.6", "-o", "part.yuv", "-y"],
+        ["transcode", *CLIP, "--to", "0.2", "-o", "part.yuv", "-y"]),
+    Job("avi", card("--pixel", "I420", "-o", "card.avi"), card("--pixel", "YUYV", "-o", "card.avi")),
+    Job("pictures", card("-o", "card.png"), card("-o", "card.png", length=0.28, size="48x64")),
+    Job("channels", ["transcode", "in.wav", "--split-channels", "-o", "ch.wav", "-y"],
+        ["transcode", "in3.wav", "--split-channels", "-o", "ch.wav", "-y"]),
+    Job("frame", ["frame", *CLIP, "--at", "0.2", "-o", "shot.png", "-y"], ["frame", *CLIP, "-o", "shot.png", "-y"]),
+    Job("sheet", ["frame", *CLIP, "--sheet", "12x1", "-o", "sheet.png", "-y"],
+        ["frame", *CLIP, "--sheet", "16x1", "-o", "sheet.png", "-y"]),
+    Job("effects", ["transcode", *CLIP, *EFFECTS, "-o", "burnt.yuv", "-y"],
+        ["transcode", *CLIP, "-o", "burnt.yuv", "-y"]),
+    Job("task", ["transcode", "in.wav", "-o", "out.wav", "--save-task", "task.xml", "-y"],
+        ["transcode", "in3.wav", "-o", "out.wav", "--save-task", "task.xml", "-y"], loose=("task.xml",)),
+    Job("captions", ["captions", "one.scc", "--json"], stdout=True),
+    Job("info", ["info", "in.wav", "talk.srt", "--json"], stdout=True),
+]
+
+
+def pattern(count, step=7):
+    return bytes((i * step + i // 251) & 255 for i in range(count))
+
+
+def wav(data, channels=2, bits=16, rate=44100):
+    frame = channels * bits // 8
+    head = b"fmt " + struct.pack("<IHHIIHH", 16, 1, channels, rate, rate * frame, frame, bits)
+    head += b"data" + struct.pack("<I", len(data))
+    return b"RIFF" + struct.pack("<I", 4 + len(head) + len(data)) + b"WAVE" + head + data
+
+
+def png(width, height):
+    """A picture of 8-bit RGB."""
+    def chunk(kind, data):
+        return struct.pack(">I", len(data)) + kind + data + struct.pack(">I", zlib.crc32(kind + data))
+    rows = b"".join(b"\0" + pattern(width * 3, row + 1) for row in range(height))
+    return (b"\x89PNG\r\n\x1a\n" + chunk(b"IHDR", struct.pack(">IIBBBBB", width, height, 8, 2, 0, 0, 0)) +
+            chunk(b"IDAT", zlib.compress(rows)) + chunk(b"IEND", b""))
+
+
+SRT = b"1\n00:00:00,000 --> 00:00:00,300\nHello\n\n2\n00:00:00,400 --> 00:00:00,800\n<i>again</i>\n"
+SCC = (b"Scenarist_SCC V1.0\n\n"
+       b"00:00:01:00\t9420 9420 94ae 94ae 9470 9470 c8e5 ecec ef80 942f 942f\n\n00:00:03:00\t942c 942c\n")
+
+
+def inputs():
+    return {"in.wav": wav(pattern(12000)), "in3.wav": wav(pattern(9000, 11), channels=3),
+            "clip.yuv": pattern(64 * 48 * 3 // 2 * 20), "mark.png": png(20, 10), "talk.srt": SRT, "one.scc": SCC}

@@ -1,0 +1,184 @@
+"""Runs the tool in a folder of its own and says what is wrong with how a run ended."""
+import dataclasses
+import os
+import pathlib
+import re
+import shlex
+import shutil
+import signal
+import subprocess
+import tempfile
+
+import jobs
+
+PATIENCE = 60  # seconds; a run that takes longer hangs
+BUILT = "SWEEP_REPORT", "LD_PRELOAD"
+INTERNAL = re.compile(r"Qv|qv[A-Z_]|::|bad_alloc|\.tarsel-|assert|std::", re.IGNORECASE)
+CRASH = re.compile(r"Sanitizer|runtime error|terminate called|core dumped")
+ASIDE = ("tarsel: warning: ", "tarsel: wrote ", "tarsel: stopping; ")
+STOPPED = {signal.SIGHUP: 129, signal.SIGINT: 130, signal.SIGTERM: 143}
+
+
+@dataclasses.dataclass
+class Outcome:
+    status: object  # the exit status, minus a signal, or "hang"
+    text: str
+    stdout: bytes
+    command: str
+
+    def ended(self):
+        return "ok" if self.status == 0 else self.status
+
+
+class Box:
+    """A folder with the inputs, in which the tool runs; `w` is the working folder and `tmp` the home."""
+
+    def __init__(self, sweep):
+        self.sweep = sweep
+
+    def __enter__(self):
+        self.root = pathlib.Path(tempfile.mkdtemp(dir=self.sweep.scratch))
+        self.work, self.temporary = self.root / "w", self.root / "tmp"
+        self.work.mkdir()
+        self.temporary.mkdir()
+        for name, data in self.sweep.inputs.items():
+            (self.work / name).write_bytes(data)
+        return self
+
+    def __exit__(self, *_):
+        shutil.rmtree(self.root, ignore_errors=True)
+
+    def lay(self, files):
+        for name, data in files.items():
+            (self.work / name).write_bytes(data)
+
+    def start(self, arguments, variables=None, wrap=(), **streams):
+        environment = {"PATH": os.environ["PATH"], "HOME": str(self.temporary), "TMPDIR": str(self.temporary),
+                       "ASAN_OPTIONS": "verify_asan_link_order=0:allocator_may_return_null=1:detect_leaks=1",
+                       **(variables or {})}
+        self.command = [*map(str, wrap), self.sweep.tool, *map(str, arguments)]
+        self.shown = " ".join([*(f"{k}={shlex.quote(str(v))}" for k, v in (variables or {}).items()),
+                               shlex.join(self.command)])
+        return subprocess.Popen(self.command, cwd=self.work, env={k: str(v) for k, v in environment.items()},
+                                **{"stdin": subprocess.DEVNULL, "stdout": subprocess.PIPE, "stderr": subprocess.PIPE,
+                                   **streams})
+
+    def finish(self, process, patience=PATIENCE):
+        try:
+            out, text = process.communicate(timeout=patience)
+            status = process.returncode
+        except subprocess.TimeoutExpired:
+            process.kill()
+            out, text = process.communicate()
+            status = "hang"
+        return Outcome(status, (text or b"").decode(errors="replace"), out or b"", self.shown)
+
+    def run(self, arguments, variables=None, wrap=(), **streams):
+        return self.finish(self.start(arguments, variables, wrap, **streams))
+
+    def files(self):
+        """What is in the working folder besides the inputs and hidden folders: name and content."""
+        found = {}
+        for path in sorted(self.work.rglob("*")):
+            name = str(path.relative_to(self.work))
+            if path.is_file() and not path.is_symlink() and not name.startswith(".tarsel"):
+                data = path.read_bytes()
+                if self.sweep.inputs.get(name) != data:
+                    found[name] = data.replace(str(self.root).encode(), b"BOX")
+        return found
+
+    def litter(self):
+        return sorted(str(path.relative_to(self.root)) for folder in (self.work, self.temporary)
+                      for path in folder.rglob(".tarsel*"))
+
+
+def crashed(outcome):
+    if outcome.status == "hang":
+        return "hangs"
+    if outcome.status < 0:
+        return f"dies of {signal.Signals(-outcome.status).name}: {outcome.text.strip()[-600:]}"
+    if outcome.status in (*STOPPED.values(), *range(0, 7)) and not CRASH.search(outcome.text):
+        return None
+    return f"crashes (status {outcome.status}): {outcome.text.strip()[-2000:]}"
+
+
+def wording(outcome):
+    """What is wrong with the message of a run that failed."""
+    lines = [line for line in outcome.text.splitlines() if line.startswith("tarsel: ") and not line.startswith(ASIDE)]
+    if len(lines) != 1:
+        return f"fails with {len(lines)} messages (status {outcome.status}): {outcome.text.strip()!r}"
+    if INTERNAL.search(outcome.text):
+        return f"shows its inside: {outcome.text.strip()!r}"
+    return None
+
+
+def difference(files, old, new, loose=()):
+    """How files are neither all old nor all new."""
+    for name in loose:
+        if files.get(name) not in (None, old.get(name), new.get(name)):
+            return f"{name} is torn"
+    old, new, files = ({k: v for k, v in files_.items() if k not in loose} for files_ in (old, new, files))
+    if files in (old, new):
+        return None
+    kinds = {name: "new" if name in new and data == new[name] else "old" if name in old and data == old[name] else
+             "unknown" if name not in old and name not in new else "torn" for name, data in files.items()}
+    kinds |= {name: "absent" for name in {**old, **new} if name not in files}
+    return "neither old nor new: " + ", ".join(f"{name} {kind}" for name, kind in sorted(kinds.items()))
+
+
+def judged(box, outcome, job, litter=True):
+    """What is wrong after a run of a job over its old files; None if it failed or succeeded as it should."""
+    old, new = box.sweep.old[job.name], box.sweep.new[job.name]
+    wrong = crashed(outcome)
+    if wrong:
+        return wrong
+    files = box.files()
+    if outcome.status == 0:
+        if difference(files, new, new, job.loose) or (job.stdout and outcome.stdout != box.sweep.stdout[job.name]):
+            return "status 0, but " + (difference(files, old, new, job.loose) or "the result is not the right one")
+    else:
+        wrong = difference(files, old, new, job.loose)
+        if wrong:
+            return f"fails (status {outcome.status}) and leaves what is {wrong}"
+    if litter and box.litter():
+        return f"leaves {', '.join(box.litter())} (status {outcome.status})"
+    return wording(outcome) if outcome.status != 0 else None
+
+
+class Sweep:
+    """What all attacks share: the tool, the helpers, the inputs, and what each job should write."""
+
+    def __init__(self, tool, scratch, helpers, options):
+        self.tool, self.scratch, self.options = str(tool), str(scratch), options
+        self.shim, self.killat = helpers
+        self.inputs = jobs.inputs()
+        self.jobs = [job for job in jobs.JOBS if options.job in (None, job.name)]
+        self.old, self.new, self.stdout = {}, {}, {}
+        self.recovers = self.ask("recover", "--help").returncode == 0
+        self.asan = b"libclang_rt.asan" in subprocess.run(["ldd", tool], capture_output=True).stdout or b"__asan" in \
+            subprocess.run(["nm", "-D", tool], capture_output=True).stdout
+
+    def ask(self, *arguments):
+        return subprocess.run([self.tool, *arguments], capture_output=True, stdin=subprocess.DEVNULL, timeout=PATIENCE)
+
+    def job(self, name):
+        return next(job for job in jobs.JOBS if job.name == name)
+
+    def refer(self):
+        """Runs each job undisturbed; its results are checked by the readers."""
+        for job in jobs.JOBS:
+            with Box(self) as box:
+                if job.earlier:
+                    self.completed(box.run(job.earlier), job)
+                self.old[job.name] = box.files()
+            with Box(self) as box:
+                outcome = box.run(job.arguments)
+                self.completed(outcome, job)
+                self.new[job.name], self.stdout[job.name] = box.files(), outcome.stdout
+            same = [n for n, data in self.new[job.name].items() if self.old[job.name].get(n) == data]
+            assert not same, f"{job.name}: {same} would not show a mixture"
+
+    @staticmethod
+    def completed(outcome, job):
+        if outcome.status != 0:
+            raise SystemExit(f"sweep: the job {job.name} fails by itself: {outcome.command}\n{outcome.text}")
