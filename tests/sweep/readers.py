@@ -19,11 +19,11 @@ RAW_FORMATS = {"BGR3": "bgr24", "BGR4": "bgr0", "I420": "yuv420p", "YUYV": "yuyv
 
 def unsound(name, data):
     """How a file contradicts itself, or None."""
-    if name.endswith(".wav"):
-        return None if sound_wav(data) else "no sound WAV file"
-    if name.endswith(".png"):
-        return None if sound_png(data) else "no sound PNG file"
-    return None if data else "empty"
+    checks = {".wav": sound_wav, ".png": sound_png}
+    try:
+        return None if checks.get(name[-4:].lower(), bool)(data) else "not a whole file of its format"
+    except (struct.error, zlib.error, KeyError):
+        return "cut"
 
 
 def sound_wav(data):
@@ -36,8 +36,8 @@ def sound_wav(data):
 
 
 def sound_png(data):
-    at, body, size = 8, b"", None
-    while data[:8] == b"\x89PNG\r\n\x1a\n" and at + 12 <= len(data):
+    at, body, size, kind = 8, b"", None, b""
+    while data[:8] == b"\x89PNG\r\n\x1a\n" and at + 12 <= len(data) and kind != b"IEND":
         length, kind = struct.unpack(">I4s", data[at:at + 8])
         if struct.unpack(">I", data[at + 8 + length:at + 12 + length])[0] != zlib.crc32(data[at + 4:at + 8 + length]):
             return False
@@ -46,7 +46,7 @@ def sound_png(data):
         body += data[at + 8:at + 8 + length] if kind == b"IDAT" else b""
         at += 12 + length
     samples = {0: 1, 2: 3, 4: 2, 6: 4}
-    return bool(size) and len(zlib.decompress(body)) == size[1] * (1 + size[0] * samples[size[3]] * size[2] // 8)
+    return bool(size) and kind == b"IEND" and at == len(data) and len(zlib.decompress(body)) == size[1] * (1 + size[0] * samples[size[3]] * size[2] // 8)
 
 
 class Unlike(Exception):

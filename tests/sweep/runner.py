@@ -159,7 +159,8 @@ class Sweep:
             subprocess.run(["nm", "-D", tool], capture_output=True).stdout
 
     def ask(self, *arguments):
-        return subprocess.run([self.tool, *arguments], capture_output=True, stdin=subprocess.DEVNULL, timeout=PATIENCE)
+        return subprocess.run([self.tool, *arguments], capture_output=True, stdin=subprocess.DEVNULL,
+                              timeout=PATIENCE, cwd=self.scratch)
 
     def job(self, name):
         return next(job for job in jobs.JOBS if job.name == name)
