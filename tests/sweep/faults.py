@@ -5,6 +5,7 @@ jobs, then a seeded sample of the others. Of all other kinds each job has the fi
 each stack fail, in each way that there is.
 """
 import collections
+import functools
 import os
 import pathlib
 import re
@@ -28,12 +29,17 @@ WAYS = {
 }
 
 
+@functools.cache
+def libraries(sweep):
+    """What is preloaded: the sanitizer has to come after the shim, which passes its calls on to it."""
+    if not sweep.asan:
+        return sweep.shim
+    asan = subprocess.run([os.environ.get("CC", "cc"), "-print-file-name=libasan.so"], capture_output=True, text=True)
+    return f"{sweep.shim}:{os.path.realpath(asan.stdout.strip())}"
+
+
 def preload(sweep, box):
-    libraries = [sweep.shim]
-    if "libasan" in subprocess.run(["ldd", sweep.tool], capture_output=True, text=True).stdout:
-        asan = subprocess.run([os.environ.get("CC", "cc"), "-print-file-name=libasan.so"], capture_output=True, text=True)
-        libraries.append(os.path.realpath(asan.stdout.strip()))
-    return {"LD_PRELOAD": ":".join(libraries), "SWEEP_REPORT": box.root / "report"}
+    return {"LD_PRELOAD": libraries(sweep), "SWEEP_REPORT": box.root / "report"}
 
 
 def calls(sweep, job):
@@ -82,7 +88,8 @@ def cases(sweep, pool, rng):
                 distinct = call not in seen
                 seen.add(call)
                 picks = [(1, way, distinct and not way[1]) for way in WAYS[kind]]
-                picks += [(nth, WAYS[kind][0], False) for nth in sorted({2, (count + 1) // 2, count} - {1}) if nth <= count]
+                later = {2, (count + 1) // 2, count} - {1} if count > 1 else set()
+                picks += [(nth, WAYS[kind][0], False) for nth in sorted(later)]
             else:
                 picks = [(nth, way, True) for nth in sorted({1, (count + 1) // 2, count}) for way in WAYS[kind]]
             for nth, way, first in picks:
@@ -92,4 +99,5 @@ def cases(sweep, pool, rng):
                     yield case
                 else:
                     more.append(case)
-    yield from more if sweep.options.all else rng.sample(more, min(len(more), sweep.options.sample))
+    every = sweep.options.all or sweep.options.case
+    yield from more if every else rng.sample(more, min(len(more), sweep.options.sample))

@@ -23,7 +23,8 @@ def card(*arguments, length=0.2, size="64x48"):
 
 RAW = ["--raw", "size=64x48,pixel=I420,rate=25"]
 CLIP = ["clip.yuv", *RAW]
-EFFECTS = ["--subtitles", "talk.srt", "--logo", "mark.png@4,4", "--timecode", "--fade", "0.1", "--crop", "60x40", "--flip"]
+EFFECTS = ["--subtitles", "talk.srt", "--logo", "mark.png@4,4", "--timecode", "--fade", "0.1", "--crop", "60x40",
+           "--flip"]
 
 JOBS = [
     Job("wav", ["transcode", "in.wav", "-o", "out.wav", "-y"], ["transcode", "in3.wav", "-o", "out.wav", "-y"]),

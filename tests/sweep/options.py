@@ -33,11 +33,13 @@ REFUSED = [
 ]
 # Whole command lines, with any status but a crash: what they say is judged as everywhere.
 OTHERS = [
-    [], [""], ["-o"], ["--"], ["transcode"], ["frame"], ["transcode", "-o", "x.wav"], ["transcode", "in.wav"], ["nosuch"],
+    [], [""], ["-o"], ["--"], ["transcode"], ["frame"], ["transcode", "-o", "x.wav"], ["transcode", "in.wav"],
+    ["nosuch"],
     ["transcode", "in.wav", "in.wav", "-o", "out.wav"], ["transcode", "in.wav", "-o", "in.wav", "-y"],
     ["transcode", "in.wav", "-o", "./../w/in.wav", "-y"], ["transcode", "in.wav", "-o", "out.nosuch"],
     ["transcode", "in.wav", "-o", ""], ["transcode", "", "-o", "out.wav"], ["transcode", "in.wav", "-o", "."],
-    [*CARD, "--timecode=25:00:00:00"], [*CARD, "--timecode=00:00:00:99"], [*CARD, "--size", "65535x65535"], [*CARD, "--rate", "119.9"], ["transcode", "testgen:", "-o", "x.yuv"],
+    [*CARD, "--timecode=25:00:00:00"], [*CARD, "--timecode=00:00:00:99"],
+    [*CARD, "--size", "65535x65535"], [*CARD, "--rate", "119.9"], ["transcode", "testgen:", "-o", "x.yuv"],
     *(["transcode", "testgen:" + value, "-o", "x.yuv"] for value in (
         "size=0x0", "size=64x48,duration=-1", "size=64x48,duration=nan", "size=64x48,duration=0", "views=99", "mode=x",
         "size=64x48,rate=0", "picture=talk.srt", "picture=", "picture=/", "aspect=0:0", "nosuch=1")),
@@ -48,12 +50,14 @@ OTHERS = [
     [*CLIP, "--subtitles", "talk.srt", "--subtitle-style", "size=0"],
     [*CLIP, "--subtitles", "talk.srt", "--subtitle-style", "size=100000000"],
     *([*CLIP, "--filter", value] for value in (
-        "", ":", "nosuch", "brightness:", "brightness:nosuch=1", "brightness:brightness=x", "brightness:brightness=1e308",
-        "brightness:brightness=nan", "cropper:width=-5", "logo", "subtitle", "timecode:size=-1", "scaler:outWidth=-1",
-        "scaler:outWidth=99999999", "deinterlace:mode=77", "frconvert", "avol", "rawdump:file=.")),
+        "", ":", "nosuch", "brightness:", "brightness:nosuch=1", "brightness:brightness=x",
+        "brightness:brightness=1e308", "brightness:brightness=nan", "cropper:width=-5", "logo", "subtitle",
+        "timecode:size=-1", "scaler:outWidth=-1", "scaler:outWidth=99999999", "deinterlace:mode=77", "frconvert", "avol",
+        "rawdump:file=.")),
     [*SOUND, "--post", "exit 7"], [*SOUND, "--save-task", "/nosuch/x.xml"], [*SOUND, "--save-task", "in.wav"],
-    ["--log", "/nosuch/folder/log", *SOUND], ["--plugins", "/nosuch", *SOUND], ["info"], ["info", "."], ["info", "/dev/null"],
-    ["captions", "in.wav"], ["formats", "--nosuch"], [*SOUND, "--muxer", "nosuch"], ["recover", "/nosuch/folder"],
+    ["--log", "/nosuch/folder/log", *SOUND], ["--plugins", "/nosuch", *SOUND],
+    ["info"], ["info", "."], ["info", "/dev/null"], ["captions", "in.wav"], ["formats", "--nosuch"],
+    [*SOUND, "--muxer", "nosuch"], ["recover", "/nosuch/folder"],
 ]
 
 
@@ -81,6 +85,7 @@ def shown(value):
 def cases(sweep, pool, rng):
     for before, option, values in REFUSED:
         for value in values:
-            yield "option", f"{option}={shown(value)}", lambda a=(sweep, [*before, f"{option}={value}"], (2,)): attack(*a)
+            line = [*before, f"{option}={value}"]
+            yield "option", f"{option}={shown(value)}", lambda line=line: attack(sweep, line, (2,))
     for number, line in enumerate(OTHERS):
         yield "option", f"line{number}", lambda line=line: attack(sweep, line, range(0, 7))

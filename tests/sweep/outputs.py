@@ -13,7 +13,7 @@ from runner import Box, crashed, judged, wording
 
 LONG = ["transcode", "testgen:size=320x240,duration=20,audio=0", "--pixel", "I420"]
 FULL = re.compile(r"space|free|full")
-PATIENCE = 8  # seconds for a run that was asked to stop
+PATIENCE = 15  # seconds for a run that was asked to stop
 
 
 def said(outcome, *statuses):
@@ -65,6 +65,35 @@ def stopped(box, arguments, number, **streams):
     return said(outcome, 128 + number), outcome
 
 
+def state_line(box):
+    """SIGUSR1 prints a line, and the job goes on."""
+    os.mkfifo(box.work / "f.yuv")
+    with reader(box.work / "f.yuv", None):
+        process = box.start([*LONG, "-o", "f.yuv", "-y"])
+        time.sleep(0.4)
+        process.send_signal(signal.SIGUSR1)
+        time.sleep(0.4)
+        process.send_signal(signal.SIGTERM)
+        outcome = box.finish(process, PATIENCE)
+    lines = [line for line in outcome.text.splitlines() if line.startswith("tarsel: ")]
+    return crashed(outcome) or (None if len(lines) > 1 and outcome.status == 143 else f"no state: {lines}"), outcome
+
+
+def post_stopped(box):
+    """A signal while the command of --post runs ends that as well."""
+    post = "echo $$ > pid.part; mv pid.part pid; exec sleep 60"
+    process = box.start(["transcode", "in.wav", "-o", "out.wav", "--post", post])
+    pid = box.work / "pid"
+    while process.poll() is None and not pid.exists():
+        time.sleep(0.01)
+    process.send_signal(signal.SIGTERM)
+    outcome = box.finish(process, PATIENCE)
+    with contextlib.suppress(OSError, ValueError):
+        os.kill(int(pid.read_text()), signal.SIGKILL)
+        return "the command is left running", outcome
+    return crashed(outcome), outcome
+
+
 def reader_leaves(box):
     os.mkfifo(box.work / "f.yuv")
     with reader(box.work / "f.yuv", 1000):
@@ -97,8 +126,9 @@ def full_disc(box, job, size):
         outcome = box.run(arguments)
         left = sorted(os.listdir(place))
         wrong = said(outcome, 0, 4)
-        wrong = wrong or (f"leaves {left}" if outcome.status and left else None)
-        wrong = wrong or ("no reason: " + outcome.text.strip() if outcome.status and not FULL.search(outcome.text) else None)
+        if not wrong and outcome.status:
+            wrong = f"leaves {left}" if left else None
+            wrong = wrong or (None if FULL.search(outcome.text) else f"no reason: {outcome.text.strip()}")
         return wrong, outcome
     finally:
         subprocess.run(["umount", "-l", place], capture_output=True)
@@ -149,7 +179,8 @@ def same_stream(box, arguments, right):
 
 
 def to_stdout(box):
-    return same_stream(box, ["transcode", *jobs.CLIP, "--to", "0.2", "-o", "/dev/stdout"], box.sweep.old["cut"]["part.yuv"])
+    arguments = ["transcode", *jobs.CLIP, "--to", "0.2", "-o", "/dev/stdout"]
+    return same_stream(box, arguments, box.sweep.old["cut"]["part.yuv"])
 
 
 def to_dash(box):
@@ -191,8 +222,8 @@ def listed(sweep):
             yield f"folder_vanishes-{hidden}-{delay}", lambda box, a=(hidden, delay): folder_vanishes(box, *a)
     for closed in ("<&-", ">&-", "2>&-", "<&- >&-", "<&- >&- 2>&-"):
         yield f"streams_closed{closed.replace(' ', '')}", lambda box, closed=closed: streams_closed(box, closed)
-    for attack in (reader_leaves, pipe_closed, full, no_folder, no_temporary, to_stdout, to_dash, to_redirected,
-                   wav_to_pipe, to_null):
+    for attack in (state_line, post_stopped, reader_leaves, pipe_closed, full, no_folder, no_temporary, to_stdout,
+                   to_dash, to_redirected, wav_to_pipe, to_null):
         yield attack.__name__, attack
 
 

@@ -8,7 +8,8 @@ import subprocess
 from runner import Box, CRASH, difference
 
 HEAD = "#include <cstdlib>\n#include <csignal>\n#include <stdexcept>\n"
-INIT = 'extern "C" __attribute__((visibility("default"))) void* plugin_init() {{ {0} }}\n'
+EXPORT = 'extern "C" __attribute__((visibility("default"))) '
+INIT = EXPORT + "void* plugin_init() {{ {0} }}\n"
 SOURCES = {  # name: the text of its one unit
     "null": INIT.format("return nullptr;"),
     "exits": INIT.format("std::exit(0);"),
@@ -21,8 +22,8 @@ SOURCES = {  # name: the text of its one unit
     "throws-when-loaded": "struct S { S() { throw 7; } } s;\n" + INIT.format("return nullptr;"),
     "crashes-when-loaded": "struct S { S() { std::raise(SIGSEGV); } } s;\n" + INIT.format("return nullptr;"),
     "no-entry": "int nothing;\n",
-    "other-abi": 'extern "C" __attribute__((visibility("default"))) unsigned qv_plugin_abi;\nunsigned qv_plugin_abi = 0xffff;\n'
-                 + INIT.format("return nullptr;"),
+    "other-abi": EXPORT + "unsigned qv_plugin_abi;\nunsigned qv_plugin_abi = 0xffff;\n" +
+                 INIT.format("return nullptr;"),
     "needs-a-symbol": 'extern "C" int no_such_function();\n' + INIT.format("no_such_function(); return nullptr;"),
 }
 JOB = "wav"
@@ -52,8 +53,8 @@ def changed(data, name):
     return data[:at] + value + data[at + len(value):]
 
 
-DAMAGED = ["cut-head", "cut-quarter", "cut-half", "cut-end", "machine", "32-bit", "big-endian", "type", "headers", "count",
-           "entry-size"]
+DAMAGED = ["cut-head", "cut-quarter", "cut-half", "cut-end", "machine", "32-bit", "big-endian", "type", "headers",
+           "count", "entry-size"]
 
 
 def place(box, folder, name, data=b"", mode=0o755):
@@ -88,7 +89,8 @@ def special(box, folder, what, good):
     return what != "folder"  # a folder is no file of that name
 
 
-SPECIAL = ["empty", "text", "fifo", "folder", "dangling", "loop", "device", "writable", "writable-folder", "writable-parent"]
+SPECIAL = ["empty", "text", "fifo", "folder", "dangling", "loop", "device", "writable", "writable-folder",
+           "writable-parent"]
 
 
 def attack(sweep, name):

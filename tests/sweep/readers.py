@@ -13,8 +13,8 @@ from runner import Box, crashed
 
 TOOLS = "ffmpeg", "ffprobe", "sox", "pngcheck", "pngfix"
 # Pixel format of the tool, and what ffmpeg calls the same samples in a raw file.
-RAW_FORMATS = {"BGR3": "bgr24", "BGR4": "bgr0", "I420": "yuv420p", "YUYV": "yuyv422", "UYVY": "uyvy422", "Y216": "y216le",
-               "YV12": None, "v210": None}
+RAW_FORMATS = {"BGR3": "bgr24", "BGR4": "bgr0", "I420": "yuv420p", "YUYV": "yuyv422", "UYVY": "uyvy422",
+               "Y216": None, "YV12": None, "v210": None}
 
 
 def unsound(name, data):
@@ -46,7 +46,9 @@ def sound_png(data):
         body += data[at + 8:at + 8 + length] if kind == b"IDAT" else b""
         at += 12 + length
     samples = {0: 1, 2: 3, 4: 2, 6: 4}
-    return bool(size) and kind == b"IEND" and at == len(data) and len(zlib.decompress(body)) == size[1] * (1 + size[0] * samples[size[3]] * size[2] // 8)
+    if not size or kind != b"IEND" or at != len(data):
+        return False
+    return len(zlib.decompress(body)) == size[1] * (1 + size[0] * samples[size[3]] * size[2] // 8)
 
 
 class Unlike(Exception):
@@ -54,7 +56,8 @@ class Unlike(Exception):
 
 
 def read(box, *command):
-    done = subprocess.run(list(map(str, command)), cwd=box.work, capture_output=True, stdin=subprocess.DEVNULL, timeout=60)
+    done = subprocess.run(list(map(str, command)), cwd=box.work, capture_output=True, stdin=subprocess.DEVNULL,
+                          timeout=60)
     if done.returncode != 0 or (command[0] == "ffmpeg" and done.stderr):
         raise Unlike(f"{' '.join(map(str, command))}: {(done.stderr or done.stdout).decode(errors='replace').strip()}")
     return done.stdout
@@ -160,17 +163,17 @@ def check_pictures(box):
 def check_stream(box):
     """What is written to a pipe: raw pictures as in a file, and a WAV that others read without its length."""
     made(box, "transcode", *jobs.CLIP, "-o", "part.yuv")
+    wav, sound_ = ["transcode", "in.wav", "--format", "wav"], jobs.pattern(12000)
+    video = ["transcode", *jobs.CLIP, "--format", "yuv"]
     for arguments, reader, right in (
-            (["transcode", *jobs.CLIP, "--format", "yuv"], ["cat"], (box.work / "part.yuv").read_bytes()),
-            (["transcode", "in.wav", "--format", "wav"], ["sox", "-q", "--ignore-length", "-t", "wav", "-", "-t", "raw", "-"],
-             jobs.pattern(12000)),
-            (["transcode", "in.wav", "--format", "wav"],
-             ["ffmpeg", "-v", "error", "-ignore_length", "1", "-f", "wav", "-i", "-", "-f", "s16le", "-"], jobs.pattern(12000))):
+            (video, "cat", (box.work / "part.yuv").read_bytes()),
+            (wav, "sox -q --ignore-length -t wav - -t raw -", sound_),
+            (wav, "ffmpeg -v error -ignore_length 1 -f wav -i - -f s16le -", sound_)):
         outcome = box.run([*arguments, "-o", "-"])
         if outcome.status != 0:
             raise Unlike(f"status {outcome.status}: {outcome.text.strip()}")
-        got = subprocess.run(reader, input=outcome.stdout, capture_output=True, timeout=60)
-        same(f"{' '.join(arguments)} read by {reader[0]}", got.stdout, right)
+        got = subprocess.run(reader.split(), input=outcome.stdout, capture_output=True, timeout=60)
+        same(f"{' '.join(arguments)} read by {reader}", got.stdout, right)
 
 
 def attack(sweep, check):

@@ -1,4 +1,5 @@
 """Runs the tool in a folder of its own and says what is wrong with how a run ended."""
+import contextlib
 import dataclasses
 import os
 import pathlib
@@ -12,7 +13,6 @@ import tempfile
 import jobs
 
 PATIENCE = 60  # seconds; a run that takes longer hangs
-BUILT = "SWEEP_REPORT", "LD_PRELOAD"
 INTERNAL = re.compile(r"Qv|qv[A-Z_]|::|bad_alloc|\.tarsel-|assert|std::", re.IGNORECASE)
 CRASH = re.compile(r"Sanitizer|runtime error|terminate called|core dumped")
 ASIDE = ("tarsel: warning: ", "tarsel: wrote ", "tarsel: stopping; ")
@@ -69,8 +69,9 @@ class Box:
             status = process.returncode
         except subprocess.TimeoutExpired:
             process.kill()
-            out, text = process.communicate()
-            status = "hang"
+            status, out, text = "hang", b"", b""
+            with contextlib.suppress(subprocess.TimeoutExpired):  # a child of it may hold the pipes
+                out, text = process.communicate(timeout=2)
         return Outcome(status, (text or b"").decode(errors="replace"), out or b"", self.shown)
 
     def run(self, arguments, variables=None, wrap=(), **streams):
@@ -155,8 +156,7 @@ class Sweep:
         self.jobs = [job for job in jobs.JOBS if options.job in (None, job.name)]
         self.old, self.new, self.stdout = {}, {}, {}
         self.recovers = self.ask("recover", "--help").returncode == 0
-        self.asan = b"libclang_rt.asan" in subprocess.run(["ldd", tool], capture_output=True).stdout or b"__asan" in \
-            subprocess.run(["nm", "-D", tool], capture_output=True).stdout
+        self.asan = b"libasan" in subprocess.run(["ldd", tool], capture_output=True).stdout
 
     def ask(self, *arguments):
         return subprocess.run([self.tool, *arguments], capture_output=True, stdin=subprocess.DEVNULL,

@@ -123,7 +123,8 @@ def arguments():
     if chosen.case:
         chosen.kind = [chosen.case.split("/")[0]]
         named = chosen.case.split("/")[1]
-        chosen.job = chosen.job or (named if chosen.kind[0] in ("kill", "signal") else None)
+        by_job = ATTACKS[chosen.kind[0]][0] in (faults, kills, signals)
+        chosen.job = chosen.job or (named if by_job else None)
     return chosen
 
 
@@ -145,10 +146,12 @@ def main():
                 report.add(*case[:2], *result.result())
         for case, result in pending:
             report.add(*case[:2], *result.result())
+    if not report.runs:
+        sys.exit("sweep: there is no such case")
     print(report.table())
     print(f"{report.runs.total()} runs in {time.monotonic() - started:.0f} s, seed {chosen.seed}: "
           f"{report.faults.total()} faults")
-    return 1 if report.faults or not report.runs else 0
+    return 1 if report.faults else 0
 
 
 if __name__ == "__main__":

@@ -65,7 +65,7 @@ class Planted(unittest.TestCase):
 
     def sweep(self, tool, job):
         jobs.JOBS[:] = [job]
-        options = types.SimpleNamespace(job=None, all=False, trace=False, sample=1000)
+        options = types.SimpleNamespace(job=None, all=False, trace=False, sample=1000, case=None, seed=1)
         made = runner.Sweep(tool, self.scratch, self.helpers, options)
         made.refer()
         return made
@@ -82,7 +82,8 @@ class Planted(unittest.TestCase):
         self.script(*parts)
         with runner.Box(made) as box:
             box.lay(made.old[job.name])
-            return runner.judged(box, box.finish(box.start(job.arguments), 2), job)
+            patience = 1 if "sleep" in parts[0] else runner.PATIENCE
+            return runner.judged(box, box.finish(box.start(job.arguments), patience), job)
 
     def test_how_a_run_ends(self):
         cases = {
