@@ -52,8 +52,8 @@ OTHERS = [
     *([*CLIP, "--filter", value] for value in (
         "", ":", "nosuch", "brightness:", "brightness:nosuch=1", "brightness:brightness=x",
         "brightness:brightness=1e308", "brightness:brightness=nan", "cropper:width=-5", "logo", "subtitle",
-        "timecode:size=-1", "scaler:outWidth=-1", "scaler:outWidth=99999999", "deinterlace:mode=77", "frconvert", "avol",
-        "rawdump:file=.")),
+        "timecode:size=-1", "scaler:outWidth=-1", "scaler:outWidth=99999999", "deinterlace:mode=77",
+        "frconvert", "avol", "rawdump:file=.")),
     [*SOUND, "--post", "exit 7"], [*SOUND, "--save-task", "/nosuch/x.xml"], [*SOUND, "--save-task", "in.wav"],
     ["--log", "/nosuch/folder/log", *SOUND], ["--plugins", "/nosuch", *SOUND],
     ["info"], ["info", "."], ["info", "/dev/null"], ["captions", "in.wav"], ["formats", "--nosuch"],
