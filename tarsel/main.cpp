@@ -9,6 +9,7 @@
 
 #include "tarsel/commands/commands.h"
 #include "tarsel/host/console.h"
+#include "tarsel/host/memory.h"
 #include "tarsel/host/outputs.h"
 #include "tarsel/host/plugins.h"
 #include "tarsel/host/signals.h"
@@ -82,7 +83,7 @@ int run(int argc, char** argv) {
 [[noreturn]] void breakOff() {
     blameLoadingPlugin("an exception left its start");
     const bool abandoned = Outputs::abandonAll();
-    const char* reason = "tarsel: an internal error";
+    const char* reason = MemoryWatch(0).ranOut() ? "tarsel: out of memory" : "tarsel: an internal error";
     try {
         if (std::current_exception()) throw;
     } catch (const std::bad_alloc&) {
@@ -100,10 +101,17 @@ int main(int argc, char** argv) {
     std::setlocale(LC_ALL, "C");
     claimStreams();
     std::set_terminate(breakOff);
+    countMemoryRefusals();
+    const MemoryWatch memory;
     try {
         return run(argc, argv);
     } catch (const Failure& failure) {
         return say(failure.exit(), failure.what());
+    } catch (const QvMemoryFailure&) {
+        return say(Exit::failed, "out of memory");
+    } catch (const QvAssertFailure&) {
+        return say(Exit::failed,
+                   memory.ranOut() ? "out of memory" : "an internal error; --log FILE shows where");
     } catch (const QvException& failure) {
         return say(Exit::failed, inLine(failure.what()));
     } catch (const std::bad_alloc&) {

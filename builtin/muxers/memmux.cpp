@@ -4,6 +4,7 @@
 
 #include "builtin/creators.h"
 #include "core/arch/qvassert.h"
+#include "core/arch/undo_p.h"
 #include "core/stream/fifo/qvbufmem.h"
 
 QvBufStream* MemMux::addStream(int type, const AnyDict& params) {
@@ -25,22 +26,28 @@ int MemMux::open() {
     const Any queue = outStream() ? outStream()->getParam("outputQueue") : Any();
     if (!queue.isGeneric() || !queue.asGeneric())
         return setError(QvStatus::failed, "The sink has no output queue");
+    Undo ending([this] { end(); });
     for (const int type : streamTypes)
         for (int nr = 0; nr < nrStreams(type); ++nr) {
             stream(type, nr)->setParam("outputQueue", queue);
             if (const int result = stream(type, nr)->init())
                 return setError(result, "Failed to init bufstream object");
         }
+    ending.dismiss();
     setState(qvStateOpen);
     return QvStatus::ok;
 }
 
 int MemMux::close() {
     if (getState() != qvStateOpen) return QvStatus::ok;
-    for (const int type : streamTypes)
-        for (int nr = 0; nr < nrStreams(type); ++nr) stream(type, nr)->destroy(0);
+    end();
     setState(stateInitialised);
     return QvStatus::ok;
+}
+
+void MemMux::end() {
+    for (const int type : streamTypes)
+        for (int nr = 0; nr < nrStreams(type); ++nr) stream(type, nr)->destroy(0);
 }
 
 QvCodec* newMemmux() { return new MemMux; }

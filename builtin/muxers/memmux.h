@@ -10,4 +10,7 @@ class MemMux : public BaseMuxer {
     // -1 when the attached stream has no queue.
     int open() override;
     int close() override;
+
+  private:
+    void end();
 };

@@ -4,6 +4,7 @@
 #include "builtin/muxers/rawavimuxbytes.h"
 #include "builtin/muxers/streamcodec.h"
 #include "core/arch/qvassert.h"
+#include "core/arch/undo_p.h"
 #include "core/measure/fourcc.h"
 #include "core/measure/qvgeometry.h"
 #include "core/stream/iofailure.h"
@@ -56,13 +57,17 @@ int RawAviMux::open() {
     for (const int type : {qvVideoStream, qvAudioStream})
         for (int nr = 0; nr < nrStreams(type); ++nr)
             if (const int result = describe(type, nr, sources)) return result;
+    Undo ending([this] { end(); });
     if (!interleaver_.open(*outStream(), std::move(sources), {riffBytes_, segments_})) return fail();
     size_t track = 0;
     for (const int type : {qvVideoStream, qvAudioStream})
         for (int nr = 0; nr < nrStreams(type); ++nr) {
             auto& output = static_cast<AviStream&>(*stream(type, nr));
-            if (output.enabled()) output.begin(interleaver_, track++, type == qvVideoStream);
+            if (!output.enabled()) continue;
+            if (const int result = output.begin(interleaver_, track++, type == qvVideoStream))
+                return setError(result, "Failed to init bufstream object");
         }
+    ending.dismiss();
     setState(qvStateOpen);
     return QvStatus::ok;
 }

@@ -9,6 +9,7 @@
 #include "builtin/muxers/streamcodec.h"
 #include "builtin/shared/rawoutput.h"
 #include "core/arch/qvassert.h"
+#include "core/arch/undo_p.h"
 #include "core/engine/files/qvfileutil.h"
 #include "core/measure/fourcc.h"
 #include "core/split/qvbufstreamsplit.h"
@@ -68,11 +69,10 @@ int RawMux::open() {
     if (checkNames() != 0)
         return setError(QvStatus::failed,
                         "Two streams would be written to one file, their extensions are equal");
-    if (const int result = openAll()) {
-        const std::string text = errorDesc();
-        finish(1);
-        return setError(result, "%s", text.c_str());
-    }
+    // Finishing says nothing of its own, so the reason stays.
+    Undo finishing([this] { finish(1); });
+    if (const int result = openAll()) return result;
+    finishing.dismiss();
     setState(qvStateOpen);
     return QvStatus::ok;
 }

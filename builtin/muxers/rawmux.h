@@ -31,7 +31,8 @@ class RawMux : public OwnFilesMuxer {
     int restore(const AnyDict& state) override;
 
     QvBufStream* addStream(int type, const AnyDict& params) override;
-    // Opens the files of all enabled streams. When one fails, all are closed again.
+    // Opens the files of all enabled streams. When one fails, by a status or an exception, all are closed
+    // again.
     int open() override;
     // Result and text tell when a file could not be written to its end.
     int close() override;

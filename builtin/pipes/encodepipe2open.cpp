@@ -1,11 +1,13 @@
 // Opening the chain from its end to its start, and finishing it the other way.
 #include <algorithm>
 #include <cstring>
+#include <new>
 #include <string>
 
 #include "builtin/pipes/encodepipe2.h"
 #include "core/arch/qvassert.h"
 #include "core/arch/qvexception.h"
+#include "core/arch/undo_p.h"
 #include "core/engine/files/qvfileutil.h"
 #include "core/engine/log/qvlog.h"
 #include "core/stream/qvbufstrm.h"
@@ -24,18 +26,22 @@ bool isModule(const QvCodec* codec, const char* name) {
     return codec && std::strcmp(codec->name(), name) == 0;
 }
 
-// Runs one step of finishing and gives its reason when it fails. A broken contract in one member must not
-// leave the others open.
-template <class Step>
-int finishing(const QvCodec& member, std::string& reason, Step step) {
+// Runs one step of finishing; when it fails, `tell` takes the result and the reason. Neither a broken
+// contract in one member nor want of memory may leave the others open.
+template <class Step, class Tell>
+int finishing(const QvCodec& member, Step step, Tell tell) {
+    int result = QvStatus::failed;
     try {
-        const int result = step();
-        if (result != QvStatus::ok) reason = member.errorDesc();
-        return result;
-    } catch (const QvException& failure) {
-        reason = failure.what();
-        return QvStatus::failed;
+        try {
+            result = step();
+            if (result != QvStatus::ok) tell(result, std::string(member.errorDesc()));
+        } catch (const QvException& failure) {
+            tell(result = QvStatus::failed, std::string(failure.what()));
+        }
+    } catch (const std::bad_alloc&) {
+        result = QvStatus::outOfMemory;
     }
+    return result;
 }
 
 }  // namespace
@@ -102,13 +108,11 @@ void EncodePipe2::limitAvchdBitrate() {
 int EncodePipe2::open() {
     QV_ASSERT_MSG(getState() != stateCreated, "EncodePipe2.open: invalid state");
     if (getState() == qvStateOpen) return QvStatus::ok;
-    try {
-        prepare();
-        return openAll();
-    } catch (const QvException&) {
-        finish(false);
-        throw;
-    }
+    Undo finishing([this] { finish(false); });
+    prepare();
+    const int result = openAll();
+    finishing.dismiss();
+    return result;
 }
 
 int EncodePipe2::openAll() {
@@ -133,8 +137,11 @@ int EncodePipe2::openAll() {
 // What was opened before is closed again; the member that failed has the say.
 int EncodePipe2::failOpen(const QvCodec& member, int result) {
     const int code = member.errorCode() != 0 ? member.errorCode() : result;
-    const std::string text = member.errorDesc();
-    finish(false);
+    std::string text;
+    {
+        const Undo finishing([this] { finish(false); });
+        text = member.errorDesc();
+    }
     setError(code, "%s", text.c_str());
     return result;
 }
@@ -177,36 +184,34 @@ int EncodePipe2::finishEncoders(bool aborting) {
         const int at = place++;
         auto* encoder = stream->encoder;
         if (!encoder) continue;
-        std::string reason;
-        const int result =
-            finishing(*encoder, reason, [&] { return aborting ? encoder->abort() : encoder->close(); });
-        if (result == QvStatus::ok) continue;
-        qv_dbg()->error("EncodePipe.%s: error (%d) at stream %s #%d (%s)", aborting ? "abort" : "close",
-                        result, qvStreamTypeName(stream->type), at, encoder->name());
-        setError(result, "%s", reason.c_str());
-        all |= result;
+        const auto tell = [&](int result, const std::string& reason) {
+            qv_dbg()->error("EncodePipe.%s: error (%d) at stream %s #%d (%s)", aborting ? "abort" : "close",
+                            result, qvStreamTypeName(stream->type), at, encoder->name());
+            setError(result, "%s", reason.c_str());
+        };
+        all |= finishing(
+            *encoder, [&] { return aborting ? encoder->abort() : encoder->close(); }, tell);
     }
     return all;
 }
 
 int EncodePipe2::finishMuxer(bool aborting) {
-    std::string reason;
-    const int result =
-        finishing(*muxer_, reason, [&] { return aborting ? muxer_->abort() : muxer_->close(); });
-    if (result == QvStatus::ok) return result;
-    setError(QvStatus::failed, aborting ? "Aborting muxer '%s' failed." : "Closing muxer '%s' failed.",
-             muxer_->displayName());
-    tellUser(reason);
-    return result;
+    const auto tell = [&](int, const std::string& reason) {
+        setError(QvStatus::failed, aborting ? "Aborting muxer '%s' failed." : "Closing muxer '%s' failed.",
+                 muxer_->displayName());
+        tellUser(reason);
+    };
+    return finishing(
+        *muxer_, [&] { return aborting ? muxer_->abort() : muxer_->close(); }, tell);
 }
 
 int EncodePipe2::finishSink(bool aborting) {
-    std::string reason;
-    const int result = finishing(*sink_, reason, [&] { return aborting ? sink_->abort() : sink_->close(); });
-    if (result == QvStatus::ok) return result;
-    setError(QvStatus::failed, "%s", aborting ? "Aborting sink failed." : "Closing sink failed.");
-    tellUser(reason);
-    return result;
+    const auto tell = [&](int, const std::string& reason) {
+        setError(QvStatus::failed, "%s", aborting ? "Aborting sink failed." : "Closing sink failed.");
+        tellUser(reason);
+    };
+    return finishing(
+        *sink_, [&] { return aborting ? sink_->abort() : sink_->close(); }, tell);
 }
 
 // The pipe's text says who failed; why is in a message of its own.

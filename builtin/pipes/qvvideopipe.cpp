@@ -41,7 +41,9 @@ int QvVf::open() {
     for (const auto& filter : filters_) {
         if (const int result = filter->open()) {
             qv_dbg()->write("[video pipe] open error");
-            return setError(result, "%s: %s", filter->name(), filter->errorDesc());
+            const bool noMemory = filter->errorCode() == QvStatus::outOfMemory;
+            return setError(noMemory ? QvStatus::outOfMemory : result, "%s: %s", filter->name(),
+                            filter->errorDesc());
         }
     }
     formGroups();
@@ -108,7 +110,9 @@ int QvVf::give(const Group& group, QvFrame& frame) {
 
 int QvVf::write(QvFrame& frame) {
     if (filters_.empty()) {
-        held_ = frame;
+        if (held_.copy(frame) != QvStatus::ok)
+            return setError(QvStatus::outOfMemory, "no memory for a frame of %dx%d", frame.width(),
+                            frame.height());
         ++framesIn_;
         return QvStatus::ok;
     }

@@ -5,6 +5,7 @@
 #include "builtin/creators.h"
 #include "builtin/shared/donothing.h"
 #include "core/arch/qvassert.h"
+#include "core/arch/undo_p.h"
 #include "core/engine/files/qvfileutil.h"
 #include "core/engine/log/qvlog.h"
 #include "core/engine/modules/params.h"
@@ -63,6 +64,7 @@ int FileSink::open() {
     written_.invalidate();
     const auto& nothing = stream_.getParam(qvSinkDoNothing);
     doNothing_ = nothing.isInt32() && nothing.asInt32() != 0;
+    Undo closing([this] { stream_.destroy(1); });
     if (!doNothing_) {
         if (!filename_.isText() || filename_.isFalse())
             return setError(QvStatus::failed, "Failed to open output file: no name is set");
@@ -74,6 +76,7 @@ int FileSink::open() {
         }
         written_ = filename_;
     }
+    closing.dismiss();
     setState(qvStateOpen);
     return QvStatus::ok;
 }

@@ -25,18 +25,25 @@ std::string locationOf(const char* file, int line) {
     return (floor.empty() ? "" : floor + "/") + path.stem().string() + "(" + std::to_string(line) + ")";
 }
 
-}  // namespace
-
-void qvSetAssertLog(QvAssertLog log) { assertLog = log; }
-
-void qvAssertFail(const char* location, const char* message) {
+template <class Failure>
+[[noreturn]] void fail(const char* location, const char* message) {
     std::string text = "*** Assertion failed at ";
     text += location ? location : "";
     if (message) text.append(": \n").append(message);
     if (const QvAssertLog log = assertLog) log(text.c_str());
-    throw QvAssertFailure(text.c_str());
+    throw Failure(text.c_str());
 }
+
+}  // namespace
+
+void qvSetAssertLog(QvAssertLog log) { assertLog = log; }
+
+void qvAssertFail(const char* location, const char* message) { fail<QvAssertFailure>(location, message); }
 
 void qvAssertFailAt(const char* file, int line, const char* message) {
     qvAssertFail(locationOf(file, line).c_str(), message);
+}
+
+void qvAssertMemoryAt(const char* file, int line, const char* message) {
+    fail<QvMemoryFailure>(locationOf(file, line).c_str(), message);
 }

@@ -16,6 +16,9 @@ void qvSetAssertLog(QvAssertLog log);
 // What the macros call: makes the location from a source file and line ("core/value/any.cpp", 1017).
 [[noreturn]] QV_API void qvAssertFailAt(const char* file, int line, const char* message);
 
+// The same for want of memory: throws QvMemoryFailure.
+[[noreturn]] QV_API void qvAssertMemoryAt(const char* file, int line, const char* message);
+
 // Fails without and with a text, always.
 #define QV_FAIL_PLAIN() qvAssertFailAt(__FILE__, __LINE__, nullptr)
 #define QV_FAIL(text) qvAssertFailAt(__FILE__, __LINE__, text)
@@ -23,3 +26,5 @@ void qvSetAssertLog(QvAssertLog log);
 // Fails, without and with a text, unless the condition holds. Never compiled out.
 #define QV_ASSERT(condition) ((condition) ? (void)0 : qvAssertFailAt(__FILE__, __LINE__, nullptr))
 #define QV_ASSERT_MSG(condition, text) ((condition) ? (void)0 : qvAssertFailAt(__FILE__, __LINE__, text))
+// For what fails only when there is no memory.
+#define QV_ASSERT_MEMORY(condition, text) ((condition) ? (void)0 : qvAssertMemoryAt(__FILE__, __LINE__, text))

@@ -40,5 +40,8 @@ QvParamException::~QvParamException() = default;
 QvAssertFailure::QvAssertFailure(const char* text) : QvException(text ? text : "assertion failure") {}
 QvAssertFailure::~QvAssertFailure() = default;
 
+QvMemoryFailure::QvMemoryFailure(const char* text) : QvAssertFailure(text) {}
+QvMemoryFailure::~QvMemoryFailure() = default;
+
 QvFileException::QvFileException(const char* text) : QvException(text ? text : "file access error") {}
 QvFileException::~QvFileException() = default;

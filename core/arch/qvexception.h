@@ -34,6 +34,14 @@ class QV_API QvAssertFailure : public QvException {
     ~QvAssertFailure() override;
 };
 
+// A broken contract whose cause is that there is no memory: where a contract promises a result that needs
+// memory, its failure is an assertion, and this tells it from a mistake of the caller.
+class QV_API QvMemoryFailure : public QvAssertFailure {
+  public:
+    explicit QvMemoryFailure(const char* text = nullptr);
+    ~QvMemoryFailure() override;
+};
+
 // Null text: "file access error".
 class QV_API QvFileException : public QvException {
   public:

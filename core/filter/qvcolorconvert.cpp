@@ -88,6 +88,8 @@ QvColorConverter::QvColorConverter(unsigned int fourcc, bool itu709To601, bool i
     codec_->setParam("outHeight", height_);
     codec_->setParam("FOURCC", static_cast<int>(fourcc));
     open_ = codec_->open() == QvStatus::ok;
+    QV_ASSERT_MEMORY(open_ || codec_->errorCode() != QvStatus::outOfMemory,
+                     "no memory for a colour converter");
     QV_ASSERT_MSG(open_, "Invalid input four cc given");
 }
 

@@ -229,7 +229,9 @@ QvVProcessPipe* QvProcessUtil::createVideoPipeAux(const VideoJobDescription& job
     auto* pipe = dynamic_cast<QvVProcessPipe*>(codec.get());
     QV_ASSERT_MSG(pipe, "invalid name for vprocess module");
     chain.fill(*pipe);
-    if (!deferOpen) QV_ASSERT_MSG(pipe->open() == QvStatus::ok, pipe->errorDesc());
+    const int opened = deferOpen ? QvStatus::ok : pipe->open();
+    QV_ASSERT_MEMORY(opened != QvStatus::outOfMemory, pipe->errorDesc());
+    QV_ASSERT_MSG(opened == QvStatus::ok, pipe->errorDesc());
     codec.release();
     return pipe;
 }

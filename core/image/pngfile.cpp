@@ -4,6 +4,7 @@
 
 #include <csetjmp>
 #include <cstdint>
+#include <new>
 #include <vector>
 
 #include <png.h>
@@ -31,10 +32,15 @@ struct Message {
 
 void onWarning(png_structp, png_const_charp) {}
 
+// By the language's own operators, so that the program notices that it runs out of memory.
+png_voidp allocate(png_structp, png_alloc_size_t bytes) { return ::operator new(bytes, std::nothrow); }
+void release(png_structp, png_voidp block) { ::operator delete(block); }
+
 class Reader {
   public:
     Message message;
-    png_structp png = png_create_read_struct(PNG_LIBPNG_VER_STRING, &message, onError, onWarning);
+    png_structp png = png_create_read_struct_2(PNG_LIBPNG_VER_STRING, &message, onError, onWarning, nullptr,
+                                               allocate, release);
     png_infop info = png ? png_create_info_struct(png) : nullptr;
 
     Reader() = default;
@@ -46,7 +52,8 @@ class Reader {
 class Writer {
   public:
     Message message;
-    png_structp png = png_create_write_struct(PNG_LIBPNG_VER_STRING, &message, onError, onWarning);
+    png_structp png = png_create_write_struct_2(PNG_LIBPNG_VER_STRING, &message, onError, onWarning, nullptr,
+                                                allocate, release);
     png_infop info = png ? png_create_info_struct(png) : nullptr;
 
     Writer() = default;

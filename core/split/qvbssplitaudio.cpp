@@ -4,6 +4,7 @@
 #include <vector>
 
 #include "core/arch/qvassert.h"
+#include "core/arch/undo_p.h"
 #include "core/engine/files/qvfileutil.h"
 #include "core/engine/log/qvlog.h"
 #include "core/engine/status.h"
@@ -91,22 +92,25 @@ int QvBsSplitAudio::initPlain(const AnyDict& newParams) {
     merged.update(newParams);
     destroy(0);
     QvBufStream::init(merged);
+    Undo ending([this] { destroy(1); });
     inner_ = std::make_unique<QvFileBufStream>(owner());
     shareFailure(*inner_);
-    const int status = inner_->init(merged);
-    setInited(status == QvStatus::ok);
-    return status;
+    if (const int status = inner_->init(merged)) return status;
+    setInited(true);
+    ending.dismiss();
+    return QvStatus::ok;
 }
 
 int QvBsSplitAudio::init(const AnyDict& newParams) {
     const Any& isPcm = newParams.get("isPcm");
     if (isPcm.isInt32() && isPcm.asInt32() == 0) return initPlain(newParams);
     if (inner_ || wav_) destroy(0);
+    Undo ending([this] { destroy(1); });
     wav_ = std::make_unique<Wav>();
     if (const int status = QvBufStreamFifoCb::init(newParams)) return status;
-    if (openFiles()) return QvStatus::ok;
-    destroy(0);
-    return QvStatus::failed;
+    if (!openFiles()) return QvStatus::failed;
+    ending.dismiss();
+    return QvStatus::ok;
 }
 
 bool QvBsSplitAudio::openFiles() {

@@ -5,6 +5,7 @@
 #include <string>
 
 #include "core/arch/qvassert.h"
+#include "core/arch/undo_p.h"
 #include "core/engine/files/qvfileutil.h"
 #include "core/engine/log/qvlog.h"
 #include "core/engine/status.h"
@@ -32,6 +33,7 @@ int QvBsSplitVideo::init(const AnyDict& newParams) {
     if (split.isInt32() && split.asInt32() == 0) return initPlain(newParams);
     if (inner_) destroy(0);
     split_ = true;
+    Undo ending([this] { destroy(1); });
     if (const int status = QvBufStreamFifoCb::init(newParams)) return status;
     const Any& name = params().get("outfilename");
     QV_ASSERT(name.isText());
@@ -41,9 +43,9 @@ int QvBsSplitVideo::init(const AnyDict& newParams) {
     baseName_ = QvFile::getBasename(name);
     fileCounter_ = 0;
     png_ = params().get("png").isTrue();
-    const int status = png_ ? initPictures() : QvStatus::ok;
-    if (status != QvStatus::ok) destroy(0);
-    return status;
+    if (const int status = png_ ? initPictures() : QvStatus::ok) return status;
+    ending.dismiss();
+    return QvStatus::ok;
 }
 
 int QvBsSplitVideo::initPictures() {
@@ -67,12 +69,14 @@ int QvBsSplitVideo::initPlain(const AnyDict& newParams) {
     destroy(0);
     QvBufStream::init(merged);
     split_ = false;
+    Undo ending([this] { destroy(1); });
     inner_ = std::make_unique<QvFileBufStream>(owner());
     shareFailure(*inner_);
     for (int i = 0; i < observers_.size(); ++i) inner_->registerObserver(observers_.at(i));
-    const int status = inner_->init(merged);
-    setInited(status == QvStatus::ok);
-    return status;
+    if (const int status = inner_->init(merged)) return status;
+    setInited(true);
+    ending.dismiss();
+    return QvStatus::ok;
 }
 
 void QvBsSplitVideo::destroy(int abort) {

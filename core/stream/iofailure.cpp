@@ -1,6 +1,7 @@
 #include "core/stream/iofailure.h"
 
 #include <cerrno>
+#include <new>
 #include <system_error>
 
 #include "core/engine/log/qvlog.h"
@@ -8,8 +9,12 @@
 bool QvIoFailure::keep(int code, const char* what, const QvWideString& name) {
     if (code_) return false;
     code_ = code ? code : EIO;
-    text_ = std::string(what) + " '" + qv_narrow_name(name.data(), name.size()) +
-            "': " + std::generic_category().message(code_);
+    try {
+        text_ = std::string(what) + " '" + qv_narrow_name(name.data(), name.size()) +
+                "': " + std::generic_category().message(code_);
+    } catch (const std::bad_alloc&) {
+        text_.clear();  // destructors come here too
+    }
     return true;
 }
 

@@ -53,7 +53,8 @@ class Shrinker {
 
 void save(const QvFrame& picture, const Given& given) {
     Outputs& outputs = *given.outputs;
-    const Signals::Watch watch(*given.signals, nullptr, [&] { outputs.discard(); });
+    const Signals::Watch watch(
+        *given.signals, {.first = {}, .second = [&] { return outputs.discard(), false; }, .report = {}});
     const std::string name = outputs.begin("png");
     if (picture.four_cc() != QvFourcc::BGR3) makeAnyCodec("scaler", kVideoFilter);  // says that it is missing
     qv_log()->clear();
@@ -65,6 +66,7 @@ void save(const QvFrame& picture, const Given& given) {
                                         inLine(outputs.withFinalNames(reason)));
     }
     outputs.commit("png");
+    given.signals->complete();
     std::fprintf(stderr, "tarsel: wrote %s\n", inQuotes(given.output).c_str());
 }
 

@@ -1,3 +1,5 @@
+#include <utility>
+
 #include "tarsel/commands/commands.h"
 #include "tarsel/commands/outputoptions.h"
 #include "tarsel/host/signals.h"
@@ -6,6 +8,9 @@
 #include "tarsel/words/timespec.h"
 
 namespace {
+
+// Of a job whose input becomes shorter each time that it is read.
+constexpr int kMostAttempts = 3;
 
 // Options as they were given; they are parsed once the command runs.
 struct Given {
@@ -37,10 +42,18 @@ void resolve(Given& given) {
 
 void transcode(Given& given, Signals& signals) {
     resolve(given);
-    Job job(given.job, signals);
-    if (!given.job.saveTask.empty()) job.saveTask();
-    if (given.job.dryRun) return job.printPlan();
-    job.run();
+    bool saved = given.job.saveTask.empty();
+    for (int attempt = 1;; ++attempt) {
+        Job job(given.job, signals);
+        if (!std::exchange(saved, true)) job.saveTask();
+        if (given.job.dryRun) return job.printPlan();
+        try {
+            return job.run();
+        } catch (const InputShrank& shrank) {
+            if (!given.job.acceptPartial || attempt == kMostAttempts) throw;
+            given.job.warnings.push_back(shrank.warning);
+        }
+    }
 }
 
 }  // namespace

@@ -1,5 +1,7 @@
 #include "tarsel/host/keyboard.h"
 
+#include <system_error>
+
 #include <fcntl.h>
 #include <poll.h>
 #include <termios.h>
@@ -37,10 +39,12 @@ struct Keyboard::Terminal {
 Keyboard::Keyboard(bool enabled, std::function<void()> pressed) : pressed_(std::move(pressed)) {
     if (!enabled) return;
     terminal_ = std::make_unique<Terminal>();
-    if (terminal_->open())
-        thread_ = std::thread([this] { listen(); });
-    else
-        terminal_.reset();
+    try {
+        if (terminal_->open()) thread_ = std::thread([this] { listen(); });
+    } catch (const std::system_error&) {
+        // A job that gets by without a thread for keys needs no keys.
+    }
+    if (!thread_.joinable()) terminal_.reset();
 }
 
 Keyboard::~Keyboard() {

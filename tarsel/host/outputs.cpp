@@ -291,6 +291,7 @@ void Outputs::place(const Manifest& set) {
             work_.leave();
         }
         moving_ = false;
+        placed_ = result.error == 0;
     }
     if (result.error != 0) notPlaced(result);
 }

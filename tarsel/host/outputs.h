@@ -57,6 +57,8 @@ class Outputs {
     // a Failure, nothing, and then what stood there before stands there again. The final names, `output`
     // first.
     std::vector<std::string> commit(const std::string& from);
+    // Whether commit has given all files their names. From any thread.
+    bool placed() const { return placed_; }
     // Removes what was written. Safe to call at any time, from any thread, more than once: while files are
     // moved it waits for the end of that.
     void discard();
@@ -88,5 +90,6 @@ class Outputs {
     bool device_, set_ = false;
     WorkFolder work_;
     std::atomic<bool> moving_{false};  // the work folder may hold what others own
+    std::atomic<bool> placed_{false};
     std::mutex lock_;
 };

@@ -2,21 +2,25 @@
 
 #include <atomic>
 #include <mutex>
+#include <system_error>
 
 #include <pthread.h>
 #include <signal.h>
 #include <unistd.h>
 
+#include "tarsel/words/messages.h"
+
 namespace {
 
 std::atomic<int> g_received{0};
-std::mutex g_lock;
-std::function<void()> g_first, g_second;
+std::mutex g_lock;                            // held while a handler runs
+const Signals::Watch* g_innermost = nullptr;  // guarded by g_lock
+bool g_complete = false;                      // likewise
 
-sigset_t stopSignals() {
+sigset_t handledSignals() {
     sigset_t set;
     sigemptyset(&set);
-    for (int number : {SIGINT, SIGTERM, SIGHUP}) {
+    for (int number : {SIGINT, SIGTERM, SIGHUP, SIGUSR1}) {
         struct sigaction action {};
         // What the caller ignores, as nohup does, stays ignored.
         if (sigaction(number, nullptr, &action) == 0 && action.sa_handler != SIG_IGN) sigaddset(&set, number);
@@ -28,41 +32,68 @@ Exit statusOf(int signal) {
     return signal == SIGTERM ? Exit::terminated : signal == SIGHUP ? Exit::hangup : Exit::interrupted;
 }
 
+}  // namespace
+
 // Runs for the life of the process, so it is detached: a signal may come until the very end.
-void waitForSignals() {
-    const sigset_t set = stopSignals();
+void Signals::wait() {
+    const sigset_t set = handledSignals();
     for (int signal = 0;;) {
         if (sigwait(&set, &signal) != 0) continue;
-        const int earlier = g_received.exchange(signal);
         std::lock_guard guard(g_lock);
-        if (earlier != 0 || !g_first) {
-            if (g_second) g_second();
-            _exit(static_cast<int>(statusOf(signal)));
-        }
-        g_first();
+        if (signal != SIGUSR1)
+            stop(signal);
+        else if (g_innermost && g_innermost->handlers_.report)
+            g_innermost->handlers_.report();
     }
 }
 
-}  // namespace
+void Signals::stop(int signal) {
+    const bool again = g_received.exchange(signal) != 0;
+    const Handlers none;
+    const Handlers& now = g_innermost ? g_innermost->handlers_ : none;
+    if (g_complete && !again) return;
+    if (!again && now.first) return now.first(signal);
+    const bool complete = g_complete || (now.second && now.second());
+    _exit(static_cast<int>(complete ? Exit::done : statusOf(signal)));
+}
 
 Signals::Signals() {
-    const sigset_t set = stopSignals();
+    const sigset_t set = handledSignals();
     pthread_sigmask(SIG_BLOCK, &set, nullptr);
     // A closed pipe and a file that may not grow are errors of the write.
     signal(SIGPIPE, SIG_IGN);
     signal(SIGXFSZ, SIG_IGN);
-    std::thread(waitForSignals).detach();
+    try {
+        std::thread(wait).detach();
+    } catch (const std::system_error&) {
+        throw failure(Msg::toolHasNoThread);
+    }
 }
 
-Signals::~Signals() { watch(nullptr, nullptr); }
-
-void Signals::watch(std::function<void()> first, std::function<void()> second) {
+Signals::~Signals() {
     std::lock_guard guard(g_lock);
-    g_first = std::move(first);
-    g_second = std::move(second);
+    g_innermost = nullptr;
+}
+
+Signals::Watch::Watch(Signals&, Handlers handlers) : handlers_(std::move(handlers)) {
+    std::lock_guard guard(g_lock);
+    outer_ = g_innermost;
+    g_innermost = this;
+}
+
+Signals::Watch::~Watch() {
+    std::lock_guard guard(g_lock);
+    g_innermost = outer_;
 }
 
 Exit Signals::received() const {
     const int signal = g_received.load();
     return signal == 0 ? Exit::done : statusOf(signal);
+}
+
+int Signals::number() const { return g_received; }
+
+void Signals::complete() {
+    std::lock_guard guard(g_lock);
+    g_complete = true;
 }

@@ -1,4 +1,5 @@
-// SIGINT, SIGTERM and SIGHUP, handled on a thread of their own so that the handling is ordinary code.
+// SIGINT, SIGTERM, SIGHUP and SIGUSR1, handled on a thread of their own so that the handling is ordinary
+// code.
 #pragma once
 
 #include <functional>
@@ -8,32 +9,46 @@
 
 class Signals {
   public:
-    // Blocks those of them that are not ignored in this thread and those started from now on. `first` runs on
-    // the first signal; `second` on the next one, after which the process ends at once. Make it before any
-    // other thread.
+    // What a part of a command does; each may be empty.
+    struct Handlers {
+        std::function<void(int)> first;  // on the first signal that stops, with its number
+        // On the next one, or on the first if `first` is empty. The process then ends at once: with status 0
+        // if this answers that the work was complete, else with that of the signal.
+        std::function<bool()> second;
+        std::function<void()> report;  // on SIGUSR1, as often as it comes
+    };
+
+    // Blocks those of them that are not ignored in this thread and those started from now on. Make it before
+    // any other thread.
     Signals();
     ~Signals();
     Signals(const Signals&) = delete;
     Signals& operator=(const Signals&) = delete;
 
-    // While it lives, these run.
+    // While it lives, these handlers are in force, in the place of those of a Watch around it.
     class Watch {
       public:
-        Watch(Signals& signals, std::function<void()> first, std::function<void()> second)
-            : signals_(signals) {
-            signals_.watch(std::move(first), std::move(second));
-        }
-        ~Watch() { signals_.watch(nullptr, nullptr); }
+        Watch(Signals& signals, Handlers handlers);
+        ~Watch();
         Watch(const Watch&) = delete;
         Watch& operator=(const Watch&) = delete;
 
       private:
-        Signals& signals_;
+        friend class Signals;
+        Handlers handlers_;
+        const Watch* outer_;
     };
 
     // The status of a job that a signal stopped; Exit::done when none came.
     Exit received() const;
 
+    int number() const;  // of the signal; 0 when none came
+
+    // The result has its name, and no signal changes the status any more: the first is ignored, so that what
+    // is left to say is said, and the next one ends the process with status 0.
+    void complete();
+
   private:
-    void watch(std::function<void()> first, std::function<void()> second);
+    static void wait();
+    static void stop(int signal);
 };

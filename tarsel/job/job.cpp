@@ -5,6 +5,7 @@
 #include <new>
 
 #include "tarsel/host/files.h"
+#include "tarsel/words/messages.h"
 #include "tarsel/words/timespec.h"
 
 namespace {
@@ -41,7 +42,8 @@ long long JobStream::bytes(long long units) const {
     return units * frame.total_bytes();
 }
 
-Job::Job(const JobOptions& options, Signals& signals) : options_(options), signals_(signals) {
+Job::Job(const JobOptions& options, Signals& signals)
+    : options_(options), signals_(signals), warnings_(options.warnings) {
     chooseOutput();
     openInputs();
     planStreams();
@@ -95,6 +97,21 @@ void Job::openInputs() {
         sources_.back()->selectAll();
     }
     checkDamage();
+    for (const auto& source : sources_) lengths_.push_back(source->isFile() ? fileBytes(source->name()) : -1);
+}
+
+// A sound that has become shorter ends as silence, so this looks at the files themselves.
+void Job::checkLengths() const {
+    for (size_t i = 0; i < sources_.size(); ++i) {
+        const std::string& name = sources_[i]->name();
+        const long long now = sources_[i]->isFile() ? fileBytes(name) : -1;
+        if (now < 0 || now >= lengths_[i]) continue;
+        const std::string left = std::to_string(now), all = std::to_string(lengths_[i]);
+        const Failure shrank = failure(Msg::inputShrank, {name, left, all});
+        // What a device or a pipe has got can't be taken back.
+        if (outputs_ && outputs_->isDevice()) throw Failure(shrank);
+        throw InputShrank(shrank, lineOf(Msg::inputShrankTaken, {name, left, all}));
+    }
 }
 
 // A cut input is refused unless the user takes what is there.

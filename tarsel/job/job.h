@@ -1,6 +1,7 @@
 // A transcode of the tool: resolved from options to a plan, then run, checked and put in place.
 #pragma once
 
+#include <atomic>
 #include <memory>
 #include <optional>
 #include <string>
@@ -24,6 +25,15 @@ struct JobOptions {
     ProgressMode progress = ProgressMode::automatic;
     OutputPolicy policy{false};
     bool splitChannels = false, dryRun = false, acceptPartial = false, quiet = false;
+    std::vector<std::string> warnings;  // of earlier attempts
+};
+
+// An input became shorter while it was read, so that what was written has too little of it or holds silence
+// in its place. The job can be run again with what is left.
+class InputShrank : public Failure {
+  public:
+    InputShrank(const Failure& failure, std::string line) : Failure(failure), warning(std::move(line)) {}
+    std::string warning;  // for the attempt that takes what is left
 };
 
 // What an output name stands for.
@@ -82,6 +92,7 @@ class Job {
     void addStream(JobStream& stream);
     void checkNames() const;
     void checkDamage();
+    void checkLengths() const;
     void checkSpace() const;
     void redirectFilters();
     void discard();
@@ -89,7 +100,10 @@ class Job {
     void link(Runner& runner) const;
     int runLinked(Runner& runner, Progress& progress);
     [[noreturn]] void stopped(Exit signalled) const;
-    [[noreturn]] void fail(Runner& runner) const;
+    [[noreturn]] void fail(Runner& runner, int result) const;
+    [[noreturn]] void tellBetter(bool ranOut) const;
+    bool failedForMemory(const Runner& runner) const;
+    void stopIfSignalled() const;
     void checkResult();
     void checkFiles() const;
     void report(const std::vector<std::string>& names) const;
@@ -107,4 +121,5 @@ class Job {
     std::vector<std::unique_ptr<Outputs>> filterFiles_;  // what filters write
     std::unique_ptr<QvEncodePipe> pipe_;
     std::vector<std::string> warnings_;
+    std::vector<long long> lengths_;  // bytes of the inputs at the start; negative for what is no file
 };

@@ -1,15 +1,21 @@
 // Running a job: the transcoder with its callbacks, what is shown meanwhile, and how it ends.
 #include <algorithm>
 #include <atomic>
+#include <cerrno>
 #include <condition_variable>
 #include <cstdio>
 #include <mutex>
+#include <new>
 #include <optional>
 
+#include "tarsel/host/command.h"
 #include "tarsel/host/keyboard.h"
+#include "tarsel/host/memory.h"
 #include "tarsel/host/plugins.h"
+#include "tarsel/host/terminal.h"
 #include "tarsel/job/job.h"
 #include "tarsel/job/post.h"
+#include "tarsel/words/messages.h"
 #include "tarsel/words/timespec.h"
 
 // The transcoder of a job. Its callbacks run on the engine's worker; the tool waits on its own thread.
@@ -18,10 +24,24 @@ class Job::Runner : public QvTranscoder {
     Runner(Job& job, Progress& progress) : job_(job), progress_(progress) {}
     ~Runner() override { QvTranscoder::stop(); }
 
+    // The units are those of the first stream; for a report that comes on another thread.
     int cbProcess() override {
         if (stop_.load(std::memory_order_relaxed)) return 1;
+        if (first_) units_.store(first_->outProcessed(), std::memory_order_relaxed);
         if (progress_.due()) progress_.update(state("running"));
         return 0;
+    }
+
+    // Once all is linked.
+    void ready() {
+        for (const JobStream& stream : job_.streams_)
+            if (!first_) first_ = getLinkForOutput(stream.type, stream.encStream);
+    }
+
+    // From any thread, at any time of the run.
+    void report() {
+        const char* name = isPaused() ? "paused" : phase_.load();
+        progress_.report(stateAt(job_.streams_.front(), units_, name));
     }
 
     // The counts have to be taken before the links close.
@@ -31,6 +51,7 @@ class Job::Runner : public QvTranscoder {
                 stream.written = link->outProcessed();
         takeFilterFailure();
         last_ = state("closing");
+        phase_ = "closing";
         return 0;
     }
 
@@ -79,20 +100,18 @@ class Job::Runner : public QvTranscoder {
     void togglePause() { isPaused() ? unpause() : pause(); }
 
     ProgressState state(const char* name) const {
+        if (!first_) return {.state = name};
+        return stateAt(job_.streams_.front(), first_->outProcessed(), name);
+    }
+    static ProgressState stateAt(const JobStream& stream, long long processed, const char* name) {
         ProgressState s;
         s.state = name;
-        for (const JobStream& stream : job_.streams_) {
-            const TransLink* link = getLinkForOutput(stream.type, stream.encStream);
-            if (!link) continue;
-            const long long units = std::max(link->outProcessed(), 0LL);
-            if (stream.expected > 0)
-                s.part = std::min(1.0, static_cast<double>(units) / static_cast<double>(stream.expected));
-            const double rate =
-                stream.type == 1 ? static_cast<double>(stream.rate.rate()) : stream.samplerate;
-            s.outSeconds = static_cast<double>(units) / rate;
-            if (stream.type == 1) s.frame = units;
-            break;
-        }
+        const long long units = std::max(processed, 0LL);
+        if (stream.expected > 0)
+            s.part = std::min(1.0, static_cast<double>(units) / static_cast<double>(stream.expected));
+        const double rate = stream.type == 1 ? static_cast<double>(stream.rate.rate()) : stream.samplerate;
+        s.outSeconds = static_cast<double>(units) / rate;
+        if (stream.type == 1) s.frame = units;
         return s;
     }
     const ProgressState& last() const { return last_; }
@@ -123,6 +142,9 @@ class Job::Runner : public QvTranscoder {
 
     Job& job_;
     Progress& progress_;
+    const TransLink* first_ = nullptr;  // of the first stream
+    std::atomic<long long> units_{0};
+    std::atomic<const char*> phase_{"running"};
     ProgressState last_;
     std::optional<Failure> filterFailure_;
     std::atomic<bool> stop_{false};
@@ -152,13 +174,18 @@ void Job::link(Runner& runner) const {
     for (const JobStream& s : streams_)
         if (runner.link(&s.source->decoder(), s.type, s.decStream, s.encStream, s.params) < 0)
             throw Failure(Exit::failed, inLine(runner.errorDesc()));
+    runner.ready();
 }
 
 int Job::runLinked(Runner& runner, Progress& progress) {
     if (outputs_) pipe_->setFilename(Any(outputs_->begin(primaryExtension()).c_str()));
     progress.start();
     qv_log()->clear();
+    stopIfSignalled();
     int result = runner.transcode(false);
+    // So it stays only where no worker could be started.
+    if (result == QvStatus::failed && runner.isTranscoding())
+        throw failure(Msg::runHasNoThread, {options_.output});
     if (result == QvStatus::ok || result == QvStatus::warning) {
         Keyboard keyboard(progress.onTerminal(), [&] { runner.togglePause(); });
         result = runner.wait([&] {
@@ -176,26 +203,64 @@ void Job::run() {
     redirectFilters();
     Progress progress(options_.quiet ? ProgressMode::off : options_.progress, "task 1 of 1  ");
     std::vector<std::string> names;
+    // What has begun to take its place is neither left half-way nor taken back.
+    const auto leave = [&] {
+        discard();
+        return outputs_ && outputs_->placed();
+    };
+    const Signals::Watch placing(signals_, {.first = [](int) {}, .second = leave, .report = {}});
     {
+        const MemoryWatch memory;
         Runner runner(*this, progress);
-        link(runner);
-        const Signals::Watch watch(
-            signals_, [&] { runner.requestStop(); }, [&] { discard(); });
-        const int result = runLinked(runner, progress);
-        if (const Exit signalled = signals_.received(); signalled != Exit::done) {
-            discard();
-            stopped(signalled);
+        const Signals::Watch running(signals_, {.first = [&](int) { runner.requestStop(); },
+                                                .second = leave,
+                                                .report = [&] { runner.report(); }});
+        try {
+            link(runner);
+            const int result = runLinked(runner, progress);
+            stopIfSignalled();
+            if (result != 0 && result != QvStatus::endOfStream) fail(runner, result);
+            if (runner.filterFailure()) throw *runner.filterFailure();
+        } catch (...) {
+            if (signals_.received() == Exit::done) checkLengths();
+            tellBetter(memory.ranOut());
         }
-        if (result != 0 && result != QvStatus::endOfStream) fail(runner);
-        if (runner.filterFailure()) throw *runner.filterFailure();
+        checkLengths();
         takeWarnings();
         checkResult();
+        stopIfSignalled();
         if (outputs_) names = outputs_->commit("raw");
         for (auto& file : filterFiles_) file->commit("");
     }
-    showWarnings();
-    if (!options_.quiet) report(names);
+    if (options_.post.empty()) signals_.complete();
+    // The result is there, whether or not there is memory to say so.
+    try {
+        showWarnings();
+        if (!options_.quiet) report(names);
+    } catch (const std::bad_alloc&) {
+        writeToStderr("tarsel: done; there was no memory to say more\n");
+    }
     if (!options_.post.empty()) runPost(names);
+    signals_.complete();
+}
+
+// Of a failure on its way: that memory ran out is the reason of all that fails afterwards, and what the
+// engine says about a broken contract is for its log.
+void Job::tellBetter(bool ranOut) const {
+    try {
+        throw;
+    } catch (const Failure& failure) {
+        if (!ranOut || failure.exit() >= Exit::hangup) throw;
+    } catch (const QvMemoryFailure&) {
+    } catch (const std::bad_alloc&) {
+    } catch (const QvAssertFailure&) {
+        if (!ranOut) throw failure(Msg::runBroken, {options_.output});
+    }
+    throw failure(Msg::runOutOfMemory, {options_.output});
+}
+
+void Job::stopIfSignalled() const {
+    if (const Exit signalled = signals_.received(); signalled != Exit::done) stopped(signalled);
 }
 
 // What filters write is an output like the others: it gets its name when the job is complete. A device takes
@@ -233,9 +298,26 @@ void Job::stopped(Exit signalled) const {
                                     : "stopped; nothing was left behind");
 }
 
+bool Job::failedForMemory(const Runner& runner) const {
+    const auto lacked = [](const QvCodec* codec) {
+        return codec && codec->errorCode() == QvStatus::outOfMemory;
+    };
+    if (lacked(pipe_.get()) || lacked(pipe_->getMuxer()) || lacked(pipe_->sink())) return true;
+    const auto fileLacked = [](const QvBufStream* file) { return file && file->ioError() == ENOMEM; };
+    if (fileLacked(pipe_->sink()->stream())) return true;
+    return std::any_of(streams_.begin(), streams_.end(), [&](const JobStream& s) {
+        const TransLink* link = runner.getLinkForOutput(s.type, s.encStream);
+        return lacked(&s.source->decoder()) || lacked(pipe_->encoder(s.type, s.encStream)) ||
+               (link && link->errorCode() == QvStatus::outOfMemory) ||
+               fileLacked(pipe_->getMuxer()->stream(s.type, s.encStream));
+    });
+}
+
 // The reason stands in the object that failed: a decoder, one of the output's members, where the file knows
 // what the system said, a filter, or a link.
-void Job::fail(Runner& runner) const {
+void Job::fail(Runner& runner, int result) const {
+    if (result == QvStatus::outOfMemory || failedForMemory(runner))
+        throw failure(Msg::runOutOfMemory, {options_.output});
     for (const auto& source : sources_)
         if (source->decoder().errorCode() < 0 && source->decoder().errorCode() != QvStatus::endOfStream)
             throw Failure(Exit::input, "can't read " + inQuotes(source->name()) + ": " +
@@ -277,7 +359,23 @@ void Job::report(const std::vector<std::string>& names) const {
 }
 
 void Job::runPost(const std::vector<std::string>& names) const {
-    const int status = execute_process(Any(postCommand(options_.post, options_.inputs, names).c_str()));
+    const std::string first = names.empty() ? options_.output : names.front();
+    const auto stopWith = [&](Exit signalled, Msg why) { throw Failure(signalled, lineOf(why, {first})); };
+    if (const Exit signalled = signals_.received(); signalled != Exit::done)
+        stopWith(signalled, Msg::stoppedBeforePost);
+    ShellCommand command(postCommand(options_.post, options_.inputs, names));
+    int status = 0;
+    {
+        const Signals::Watch running(
+            signals_, {.first = [&](int signal) { command.signal(signal); },
+                       .second = [&] { return command.kill(), false; },
+                       .report = [] { std::fputs("tarsel: the command of --post is running\n", stderr); }});
+        // One that came before there was anybody to pass it on.
+        if (const int signal = signals_.number()) command.signal(signal);
+        status = command.wait();
+    }
+    if (const Exit signalled = signals_.received(); signalled != Exit::done)
+        stopWith(signalled, Msg::stoppedInPost);
     if (status == 0) return;
     throw Failure(Exit::failed, "the command of --post " +
                                     (status < 0 ? std::string("can't be run")

@@ -34,6 +34,11 @@ std::string fitted(const std::string& text) {
     return cut;
 }
 
+// Seconds; negative when unknown.
+double etaOf(const ProgressState& state, double elapsed) {
+    return state.part > 0 ? elapsed * (1 - state.part) / state.part : -1;
+}
+
 double round1(double value) { return std::round(value * 10) / 10; }
 
 }  // namespace
@@ -64,14 +69,26 @@ void Progress::update(const ProgressState& state) {
 
 void Progress::finish(const ProgressState& state) {
     if (json_) show("end", state);
+    const std::lock_guard guard(lock_);
     if (line_ && shown_) std::fputs("\r\x1b[K", stderr);
     shown_ = false;
 }
 
+void Progress::report(const ProgressState& state) {
+    const std::lock_guard guard(lock_);
+    const double elapsed = QvTimer::absoluteTime() - begin_;
+    const double eta = etaOf(state, elapsed);
+    if (json_) return showJson("progress", state, elapsed, eta);
+    std::fprintf(stderr, "%starsel:%s  %s\n", line_ ? "\r\x1b[K" : "",
+                 line(state, elapsed, eta, false).c_str(), state.state);
+    std::fflush(stderr);
+}
+
 void Progress::show(const char* event, const ProgressState& state) {
+    const std::lock_guard guard(lock_);
     last_ = QvTimer::absoluteTime();
     const double elapsed = last_ - begin_;
-    const double eta = state.part > 0 ? elapsed * (1 - state.part) / state.part : -1;
+    const double eta = etaOf(state, elapsed);
     if (json_)
         showJson(event, state, elapsed, eta);
     else
@@ -79,19 +96,24 @@ void Progress::show(const char* event, const ProgressState& state) {
     shown_ = true;
 }
 
-void Progress::showLine(const ProgressState& state, double elapsed, double eta) {
+std::string Progress::line(const ProgressState& state, double elapsed, double eta, bool color) const {
     const double speed = elapsed > 0 ? state.outSeconds / elapsed : 0;
-    std::string text = label_;
+    std::string text;
     char part[96];
     if (state.part >= 0) {
-        std::snprintf(part, sizeof part, "%s%5.1f %%%s", color_ ? "\x1b[1m" : "", state.part * 100,
-                      color_ ? "\x1b[0m" : "");
+        std::snprintf(part, sizeof part, "%s%5.1f %%%s", color ? "\x1b[1m" : "", state.part * 100,
+                      color ? "\x1b[0m" : "");
         text += part;
     }
     std::snprintf(part, sizeof part, "  frame %lld  %.1fx", state.frame, speed);
     text += part;
     if (eta >= 0)
         text += "  left " + formatTime(std::ceil(eta)).substr(0, formatTime(std::ceil(eta)).size() - 4);
+    return text;
+}
+
+void Progress::showLine(const ProgressState& state, double elapsed, double eta) {
+    std::string text = label_ + line(state, elapsed, eta, color_);
     if (std::string_view(state.state) == "paused") text += "  paused (p resumes)";
     std::fprintf(stderr, "\r%s\x1b[K", fitted(text).c_str());
     std::fflush(stderr);

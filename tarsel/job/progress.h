@@ -1,6 +1,8 @@
 // What a person or a program sees while a job runs: one line on a terminal, JSON lines, or nothing.
 #pragma once
 
+#include <atomic>
+#include <mutex>
 #include <string>
 
 struct ProgressState {
@@ -27,6 +29,8 @@ class Progress {
     void show(const ProgressState& state) {
         if (json_ || line_) show("progress", state);
     }
+    // Prints it once, whatever the mode: an object in JSON, otherwise a line that stays. From any thread.
+    void report(const ProgressState& state);
     // Sends the last event; the line goes.
     void finish(const ProgressState& state);
     bool onTerminal() const { return line_; }
@@ -34,9 +38,13 @@ class Progress {
   private:
     void show(const char* event, const ProgressState& state);
     void showLine(const ProgressState& state, double elapsed, double eta);
+    std::string line(const ProgressState& state, double elapsed, double eta, bool color) const;
     void showJson(const char* event, const ProgressState& state, double elapsed, double eta);
 
     std::string label_;
-    bool line_ = false, json_ = false, shown_ = false, color_ = false;
-    double begin_ = 0, last_ = 0;  // seconds of the system's counter
+    bool line_ = false, json_ = false, color_ = false;
+    std::mutex lock_;  // of what is shown
+    bool shown_ = false;
+    double begin_ = 0;             // seconds of the system's counter
+    std::atomic<double> last_{0};  // likewise
 };

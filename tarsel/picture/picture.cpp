@@ -3,8 +3,10 @@
 #include <algorithm>
 #include <charconv>
 #include <cstring>
+#include <new>
 
 #include "tarsel/host/files.h"
+#include "tarsel/host/memory.h"
 #include "tarsel/picture/overlays.h"
 #include "tarsel/words/failure.h"
 #include "tarsel/words/keyvalues.h"
@@ -297,6 +299,7 @@ void tryFilter(QvVideoFilter& filter) {
     if (!filterFile(filter, QV_GUI_FILESELECT_SAVE).empty()) return;
     int result = QvStatus::failed;
     std::string reason;
+    const MemoryWatch memory;
     try {
         result = filter.open();
         reason = filter.errorDesc();
@@ -305,6 +308,7 @@ void tryFilter(QvVideoFilter& filter) {
         reason = failure.what();
     }
     if (result == QvStatus::ok) return;
+    if (memory.ranOut()) throw std::bad_alloc();
     const std::string_view name = filter.name();
     const bool reads = !filterFile(filter, QV_GUI_FILESELECT_LOAD).empty();
     throw Failure(reads ? Exit::input : Exit::usage,

@@ -37,6 +37,15 @@ constexpr Message kMessages[] = {
     {Msg::pluginUnfit,        Exit::module, "the plug-in {file} was not loaded",      "it {system}", "get a version of it that was built for this engine, or remove it"},
     {Msg::pluginFailed,       Exit::module, "the plug-in {file} was not loaded",      "it {system}", "ask its maker, or remove it"},
     {Msg::pluginEndedAll,     Exit::module, "the plug-in {file} ended the program while it was loaded", "{text}", "remove it, or get another version of it"},
+    // runs
+    {Msg::runOutOfMemory,     Exit::failed, "can't make {file}", "out of memory",                    "free some memory, or use smaller pictures"},
+    {Msg::runHasNoThread,     Exit::failed, "can't make {file}", "no thread could be started",       "end other programs, or raise the limits (ulimit -u, ulimit -v)"},
+    {Msg::toolHasNoThread,    Exit::failed, "can't start",       "no thread could be started",       "end other programs, or raise the limits (ulimit -u, ulimit -v)"},
+    {Msg::runBroken,          Exit::failed, "can't make {file}", "an internal error",                "--log FILE shows where"},
+    {Msg::stoppedBeforePost,  Exit::failed, "stopped before the command of --post ran", "{file} is complete", "run the command yourself if you want it"},
+    {Msg::stoppedInPost,      Exit::failed, "stopped in the command of --post", "it got the signal and has ended", "{file} is complete"},
+    {Msg::inputShrank,        Exit::input,  "can't use {file}",  "it became shorter while it was read, {text} of {text} bytes are left", "--accept-partial takes what is there"},
+    {Msg::inputShrankTaken,   Exit::input,  "{file} became shorter while it was read", "the job was run again with the {text} of {text} bytes that are left", ""},
 };
 // clang-format on
 

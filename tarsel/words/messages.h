@@ -38,6 +38,15 @@ enum class Msg : unsigned char {
     pluginUnfit,
     pluginFailed,
     pluginEndedAll,
+    // runs
+    runOutOfMemory,
+    runHasNoThread,
+    toolHasNoThread,
+    runBroken,
+    stoppedBeforePost,
+    stoppedInPost,
+    inputShrank,
+    inputShrankTaken,
     count,  // of messages, none itself
 };
 

@@ -6,6 +6,7 @@
 //     ... outputs.calls holds what ran, as "filesink.open"
 #pragma once
 
+#include <new>
 #include <string>
 #include <vector>
 
@@ -22,7 +23,7 @@
 
 class FailingOutputs {
   public:
-    enum How { status, assertion };
+    enum How { status, assertion, noMemory };
     static constexpr int failure = -77;
 
     FailingOutputs() {
@@ -53,6 +54,7 @@ class FailingOutputs {
         const bool ends = call.ends_with(".close") || call.ends_with(".abort");
         const int result = !fails || ends ? real() : 0;
         if (!fails) return result;
+        if (self_->how == noMemory) throw std::bad_alloc();
         if (self_->how == assertion) qvAssertFail("test", (call + " asserts").c_str());
         return codec.fail(call + " fails");
     }

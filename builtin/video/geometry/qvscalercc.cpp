@@ -124,9 +124,13 @@ int QvScalerCC::restore(const AnyDict& dict) {
 int QvScalerCC::open() {
     ready_ = 0;
     started_ = cleared_ = false;
-    if (!qvPixelFormat(settings_.fourcc) || settings_.outWidth <= 0 || settings_.outHeight <= 0 ||
-        output_.init(settings_.fourcc, settings_.outWidth, settings_.outHeight) != QvStatus::ok)
-        return setError(QvStatus::failed, "QvScalerCC::Can not init output frame!");
+    int made = QvStatus::failed;
+    if (qvPixelFormat(settings_.fourcc) && settings_.outWidth > 0 && settings_.outHeight > 0)
+        made = output_.init(settings_.fourcc, settings_.outWidth, settings_.outHeight);
+    if (made != QvStatus::ok) {
+        setError(made, "QvScalerCC::Can not init output frame!");  // the code tells want of memory
+        return QvStatus::failed;
+    }
     setState(static_cast<State>(stateOpened));
     return QvStatus::ok;
 }

@@ -14,6 +14,7 @@
 #include "core/engine/status.h"
 #include "core/filter/qvcolorconvert.h"
 #include "core/media/qvdraw.h"
+#include "core/media/wholecopy_p.h"
 
 namespace {
 
@@ -223,9 +224,10 @@ struct QvSubtitleRender::Private {
 
     // Letters of the colour on black, which the mask then shows around them.
     void applyEffect(unsigned rgb, QvFrame& colours, QvFrame& mask) {
-        letters = mask;
+        qvCopyWhole(letters, mask);
         colours.setBlack();
-        QvFrame full(colours);
+        QvFrame full;
+        qvCopyWhole(full, colours);
         fill(full, rgb);
         colours.blend(0, 0, full, &letters);
         outlineMask(letters, mask, 1);

@@ -5,6 +5,7 @@
 #include "core/caption/text/textlayout_p.h"
 #include "core/caption/text/textmask_p.h"
 #include "core/media/qvframe.h"
+#include "core/media/wholecopy_p.h"
 #include "core/value/anycontainer.h"
 
 namespace {
@@ -69,20 +70,19 @@ void sumRow(const Byte* row, int width, unsigned short* sums) {
     sums[width - 1] = sum(row[width - 2], row[width - 1], 0);
 }
 
-// Each pixel becomes the mean of its 3 x 3 neighbourhood, with these weights both ways.
-QvFrame blurred(const QvFrame& mask) {
+// Each pixel of `out`, which has the size of the mask, becomes the mean of its 3 x 3 neighbourhood in the
+// mask, with these weights both ways.
+void blur(const QvFrame& mask, QvFrame& out) {
     const auto width = static_cast<std::size_t>(mask.width());
     std::vector<unsigned short> sums(width * (static_cast<std::size_t>(mask.height()) + 2));
     for (int y = 0; y < mask.height(); ++y)
         sumRow(rowOf(mask, y), mask.width(), sums.data() + width * (static_cast<std::size_t>(y) + 1));
-    QvFrame out(mask);
     for (int y = 0; y < mask.height(); ++y) {
         const unsigned short* above = sums.data() + width * static_cast<std::size_t>(y);
         Byte* to = rowOf(out, y);
         for (std::size_t x = 0; x < width; ++x)
             to[x] = static_cast<Byte>((above[x] + 2 * above[x + width] + above[x + 2 * width] + 8) / 16);
     }
-    return out;
 }
 
 void drawGlyph(const GlyphPlace& place, int fields, const QvRect& area, QvFrame& mask) {
@@ -122,14 +122,17 @@ void drawLetters(const TextLine& line, int baseline, const AnyVector& fieldMasks
 }
 
 void outlineMask(const QvFrame& letters, QvFrame& mask, int radius) {
-    mask = letters;
+    qvCopyWhole(mask, letters);
     if (radius > 1) return joinCorners(letters, mask, radius);
     for (const int dx : {1, -1}) addMoved(mask, letters, dx, 0);
-    const QvFrame wide(mask);
+    QvFrame wide;
+    qvCopyWhole(wide, mask);
     for (const int dy : {1, -1}) addMoved(mask, wide, 0, dy);
 }
 
 void addShadow(QvFrame& mask, bool soft) {
-    const QvFrame caster = soft ? blurred(mask) : mask;
+    QvFrame caster;
+    qvCopyWhole(caster, mask);
+    if (soft) blur(mask, caster);
     addMoved(mask, caster, 1, 1);
 }

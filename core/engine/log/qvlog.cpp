@@ -1,6 +1,7 @@
 #include "core/engine/log/qvlog.h"
 
 #include <mutex>
+#include <new>
 #include <string>
 
 #include "core/arch/formattext_p.h"
@@ -159,8 +160,13 @@ void QvDbgLog::logs(int mask, const char* text) {
         std::fprintf(stream, "%s %s\n", tagOf(mask), line.text());
         std::fflush(stream);
     }
-    if (QvLogBase* receiver = logger()) callLogger(*receiver, mask, line.text());
-    if (debugger_) qv_platform().debugOutput((std::string(tagOf(mask)) + " " + line.text() + "\n").c_str());
+    try {
+        if (QvLogBase* receiver = logger()) callLogger(*receiver, mask, line.text());
+        if (debugger_)
+            qv_platform().debugOutput((std::string(tagOf(mask)) + " " + line.text() + "\n").c_str());
+    } catch (const std::bad_alloc&) {
+        // Lines come from clean-ups too, which go on without them.
+    }
 }
 
 void QvDbgLog::vlog(int mask, const char* format, va_list args) {

@@ -1,5 +1,6 @@
 #include <algorithm>
 #include <mutex>
+#include <new>
 #include <string>
 
 #include "core/arch/formattext_p.h"
@@ -58,11 +59,15 @@ void QvLogBuffer::logs(int mask, const char* text) {
     if (mask == QvLogMask::error) ++errors_;
     if (mask == QvLogMask::warning) ++warnings_;
     if (copy_) std::fprintf(copy_, "%s\n", text);
-    AnyDict message;
-    message.set("text", text);
-    message.set("type", mask);
-    messages_.append(message);
-    qv_dbg()->logs(mask, asFormatted(text).c_str());
+    try {
+        AnyDict message;
+        message.set("text", text);
+        message.set("type", mask);
+        messages_.append(message);
+        qv_dbg()->logs(mask, asFormatted(text).c_str());
+    } catch (const std::bad_alloc&) {
+        // Messages come from clean-ups too, which go on without them.
+    }
 }
 
 void QvLogBuffer::logs(int mask, const Any& text) {

@@ -1,5 +1,7 @@
 #include "core/engine/modules/qvcodec.h"
 
+#include <new>
+
 #include "core/arch/formattext_p.h"
 #include "core/arch/qvassert.h"
 #include "core/arch/qvexception.h"
@@ -131,7 +133,11 @@ int QvCodec::setError(int code) {
 
 int QvCodec::storeError(int code, const char* format, va_list args) {
     errorCode_ = code;
-    errorText_ = QvFormattedText<maxErrorText>(format, args).text();
+    try {
+        errorText_ = QvFormattedText<maxErrorText>(format, args).text();
+    } catch (const std::bad_alloc&) {
+        errorText_.invalidate();  // a failure is never told by throwing
+    }
     if (code != QvStatus::ok) qv_dbg()->error("[%s] %s (%d)", displayName(), errorDesc(), code);
     return code;
 }

@@ -90,6 +90,7 @@ void QvThreadPool::State::close(Job& job) {
 
 QvThreadPool::QvThreadPool(int workers) : state_(std::make_unique<State>()) {
     State* const state = state_.get();
+    state->workers.reserve(static_cast<std::size_t>(std::max(workers, 0)));  // one that runs can't be dropped
     for (int i = 0; i < workers; ++i) {
         std::thread worker = qv_platform().startThread([state] { state->workerLoop(); });
         if (!worker.joinable()) break;

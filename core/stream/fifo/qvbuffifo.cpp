@@ -9,6 +9,7 @@ namespace {
 
 constexpr int defaultSize = 0x200000;
 constexpr int defaultChunk = 0x40001;
+constexpr char initFailed[] = "Fifo init failed";
 
 void tellObservers(void* stream, unsigned offset, unsigned id, void* info, unsigned size) {
     notifyObservers(static_cast<QvBufStream*>(stream)->observers(), offset, id, info, size);
@@ -33,9 +34,9 @@ int QvBufStreamFifo::init(const AnyDict& newParams) {
     QvBufStream::init(newParams);
     const int size = int32Param("size", defaultSize);
     const int chunk = int32Param("chunk", defaultChunk);
-    if (size >= 0 && chunk >= 0)
-        object_ = makeObject(static_cast<unsigned>(size), static_cast<unsigned>(chunk));
-    QV_ASSERT_MSG(object_, "Fifo init failed");
+    QV_ASSERT_MSG(chunk >= 0 && size >= chunk, initFailed);
+    object_ = makeObject(static_cast<unsigned>(size), static_cast<unsigned>(chunk));
+    QV_ASSERT_MEMORY(object_, initFailed);
     object_->notify = tellObservers;
     object_->listener = static_cast<QvBufStream*>(this);
     setInited(true);
@@ -134,9 +135,9 @@ int QvBufStreamFifoCb::init(const AnyDict& newParams) {
     const int size = int32Param("size", defaultSize);
     const int chunk = int32Param("chunk", defaultChunk);
     const int threshold = int32Param("callback", size / 5);
-    if (size >= 0 && chunk >= 0)
-        object_ = fifoMake<CallbackFifo>(static_cast<unsigned>(size), static_cast<unsigned>(chunk));
-    QV_ASSERT_MSG(object_, "Fifo init failed");
+    QV_ASSERT_MSG(chunk >= 0 && size >= chunk, initFailed);
+    object_ = fifoMake<CallbackFifo>(static_cast<unsigned>(size), static_cast<unsigned>(chunk));
+    QV_ASSERT_MEMORY(object_, initFailed);
     CallbackFifo* cb = callbackOf(&object_->in);
     cb->stream = this;
     cb->threshold = static_cast<unsigned>(threshold);

@@ -25,11 +25,12 @@ class QV_API QvBufStreamFifo : public QvBufStream {
     ~QvBufStreamFifo() override;
 
     using QvBufStream::init;
-    int init(const AnyDict& params) override;  // asserts a "chunk" above "size", and no memory
-    void destroy(int abort) override;          // what is buffered is lost
-    void flush() override;                     // throws away what is buffered
-    bufstream* input() override;               // asserts a FIFO that is not inited
-    bufstream* output() override;              // likewise
+    // Asserts a "chunk" above "size"; without memory the assertion is a QvMemoryFailure. Not inited then.
+    int init(const AnyDict& params) override;
+    void destroy(int abort) override;  // what is buffered is lost
+    void flush() override;             // throws away what is buffered
+    bufstream* input() override;       // asserts a FIFO that is not inited
+    bufstream* output() override;      // likewise
     // -1 for one that is registered already (logged), or is not there.
     int registerObserver(QvAuxInfoObserver* observer) override;
     int unregisterObserver(QvAuxInfoObserver* observer) override;

@@ -1,6 +1,7 @@
 #include "core/stream/file/filereader_p.h"
 
 #include <algorithm>
+#include <cerrno>
 #include <cstring>
 #include <utility>
 
@@ -12,7 +13,10 @@ FileReader::FileReader(const QvWideString& name, unsigned size, std::shared_ptr<
 std::unique_ptr<FileReader> FileReader::open(const QvWideString& name, unsigned size,
                                              std::shared_ptr<QvIoFailure> failure) {
     std::unique_ptr<FileReader> reader(new FileReader(name, size, std::move(failure)));
-    if (!reader->buffer_.data()) return nullptr;
+    if (!reader->buffer_.data()) {
+        reader->failure_->note(ENOMEM, "No memory to read", name);
+        return nullptr;
+    }
     if (!reader->file_.open(name, "rb")) {
         reader->failure_->note(reader->file_.error(), "Can not open file", name);
         return nullptr;

@@ -1,6 +1,7 @@
 #include "core/stream/file/filewriter_p.h"
 
 #include <algorithm>
+#include <cerrno>
 #include <climits>
 #include <cstdio>
 #include <cstring>
@@ -33,7 +34,10 @@ std::unique_ptr<FileWriter> FileWriter::open(const QvWideString& name, unsigned 
                                              std::shared_ptr<QvIoFailure> failure) {
     if (name.empty() || name.size() > longestName) return nullptr;
     std::unique_ptr<FileWriter> writer(new FileWriter(name, size, std::move(failure)));
-    if (!writer->buffer_.data()) return nullptr;
+    if (!writer->buffer_.data()) {
+        writer->failure_->note(ENOMEM, "No memory to write", name);
+        return nullptr;
+    }
     if (writer->file_.open(name, "wb")) return writer;
     writer->failure_->note(writer->file_.error(), "Can not open file", name);
     return nullptr;

@@ -1,6 +1,7 @@
 #include "core/stream/file/qvfilebufstream.h"
 
 #include "core/arch/qvassert.h"
+#include "core/arch/undo_p.h"
 #include "core/engine/files/qvfileutil.h"
 #include "core/engine/log/qvlog.h"
 #include "core/engine/status.h"
@@ -55,14 +56,13 @@ QvFileBufStream::~QvFileBufStream() { QvFileBufStream::destroy(0); }
 int QvFileBufStream::init(const AnyDict& newParams) {
     QvBufStream::init(newParams);
     records_ = std::make_shared<Records>();
+    Undo closing([this] { records_.reset(); });
     const int size = int32Param("size", defaultSize);
     const bool writing = !params().get("infilename").isValid();
     const QvWideString name = wideName(params().get(writing ? "outfilename" : "infilename"));
     const int status = size < 0 ? QvStatus::failed : writing ? openOutput(name) : openInput(name);
-    if (status != QvStatus::ok) {
-        records_.reset();
-        return status;
-    }
+    if (status != QvStatus::ok) return status;
+    closing.dismiss();
     setInited(true);
     return QvStatus::ok;
 }
@@ -141,13 +141,14 @@ int QvFileBufStreamRwWrite::init(const AnyDict& newParams) {
     records_ = std::make_shared<Records>();
     const int size = int32Param("size", defaultSize);
     const QvWideString name = wideName(params().get("outfilename"));
+    Undo closing([this] { records_.reset(); });
     records_->writing = true;
     if (size >= 0) records_->file = rwFileNew(name, static_cast<unsigned>(size), failure());
     if (!records_->file) {
         qv_dbg()->error("Can not open file %s", qv_narrow_name(name.data(), name.size()).c_str());
-        records_.reset();
         return QvStatus::failed;
     }
+    closing.dismiss();
     setInited(true);
     return QvStatus::ok;
 }
@@ -188,8 +189,9 @@ int QvNullBufStream::init(const AnyDict& newParams) {
     QvBufStream::init(newParams);
     const int size = int32Param("size", defaultSize);
     record_ = std::make_shared<Record>();
-    if (size >= 0) record_->bs = nullRecordNew(static_cast<unsigned>(size), nullptr);
-    QV_ASSERT_MSG(record_->bs, "File open failed");
+    QV_ASSERT_MSG(size >= 0, "File open failed");
+    record_->bs = nullRecordNew(static_cast<unsigned>(size), nullptr);
+    QV_ASSERT_MEMORY(record_->bs, "File open failed");
     setInited(true);
     return QvStatus::ok;
 }

@@ -115,7 +115,9 @@ void TransLink::copyError(int code, const Any& text) {
 int TransLink::pipeFailed(const QvException& failure) {
     // An assertion's text follows the line with its place.
     const char* text = std::strrchr(failure.what(), '\n');
-    return setError(QvStatus::failed, text ? text + 1 : failure.what());
+    const bool noMemory = dynamic_cast<const QvMemoryFailure*>(&failure);
+    setError(noMemory ? QvStatus::outOfMemory : QvStatus::failed, text ? text + 1 : failure.what());
+    return QvStatus::failed;
 }
 
 // What failed before is the reason of the failure, if anything did.

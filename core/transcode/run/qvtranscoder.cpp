@@ -157,7 +157,11 @@ int QvTranscoder::setError(int code, const char* format, ...) {
     va_end(args);
     const char* const text = formatted.text();
     p_->errorCode = code;
-    p_->errorText = text;
+    try {
+        p_->errorText = text;
+    } catch (const std::bad_alloc&) {
+        p_->errorText.clear();  // a failure is never told by throwing
+    }
     qv_dbg()->log(2, "Transcoder: %s (%d)", text, code);
     return code;
 }

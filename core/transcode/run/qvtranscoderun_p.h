@@ -51,7 +51,8 @@ class QvTranscodeRun {
     int analyze();
 
     static int totalFrames(const QvTask& task, double& rate);
-    static int closeLinks(const QvTask& task);  // closes all of them; their results joined by bits
+    // Closes all of them, also when one throws; their results joined by bits.
+    static int closeLinks(const QvTask& task);
 
   private:
     int breakOff();
@@ -67,6 +68,7 @@ class QvTranscodeRun {
     void logSettings() const;
     void beginLogFile();
     // start
+    int work();
     int runPasses();
     int mainLoop();
     int closeOutput(int result);

@@ -2,8 +2,10 @@
 // frames written so far.
 #include <algorithm>
 #include <chrono>
+#include <new>
 #include <string_view>
 
+#include "core/arch/qvexception.h"
 #include "core/encode/qvencodepipe.h"
 #include "core/encode/qvencoder.h"
 #include "core/encode/qvmuxer.h"
@@ -36,8 +38,14 @@ template <class Work>
 int QvTranscodeRun::guarded(Work work) {
     try {
         return work();
+    } catch (const QvMemoryFailure& failure) {
+        qv_dbg()->error("Transcoder: %s", failure.what());
+        return QvStatus::outOfMemory;
     } catch (const QvException& failure) {
         qv_dbg()->error("Transcoder: %s", failure.what());
+    } catch (const std::bad_alloc&) {
+        qv_dbg()->error("Transcoder: out of memory");
+        return QvStatus::outOfMemory;
     } catch (const std::exception& failure) {
         qv_dbg()->error("Transcoder: %s", failure.what());
     } catch (...) {
@@ -47,33 +55,41 @@ int QvTranscodeRun::guarded(Work work) {
 }
 
 int QvTranscodeRun::start() {
-    int result = QvStatus::ok;
-    {
-        QVThreads::QvLowPriority lowered;
-        // Lets the caller finish what it does after transcode() returns; a stop ends the wait.
-        if (p_.startDelay > 0) {
-            std::unique_lock guard(p_.lock);
-            p_.changed.wait_for(guard, std::chrono::milliseconds(p_.startDelay),
-                                [this] { return stopping(); });
-        }
-        result = guarded([this] {
-            p_.logProgress = qv_registry()->getDbgOption("log_progress").isTrue();
-            const QvMuxer* muxer = p_.task->encoder()->getMuxer();
-            p_.checkDiscSpace = muxer && std::string_view(muxer->name()) == "asfmux";
-            return runPasses();
-        });
-        if (p_.twoPass) forgetStatistics();
-    }
     try {
+        const int result = work();
         return finish(result);
-    } catch (const std::exception&) {
+    } catch (...) {
         return breakOff();
     }
 }
 
-// The last resort where not even the end of a run has the memory that it needs: whoever waits is told.
+int QvTranscodeRun::work() {
+    QVThreads::QvLowPriority lowered;
+    // Lets the caller finish what it does after transcode() returns; a stop ends the wait.
+    if (p_.startDelay > 0) {
+        std::unique_lock guard(p_.lock);
+        p_.changed.wait_for(guard, std::chrono::milliseconds(p_.startDelay), [this] { return stopping(); });
+    }
+    int result = guarded([this] {
+        p_.logProgress = qv_registry()->getDbgOption("log_progress").isTrue();
+        const QvMuxer* muxer = p_.task->encoder()->getMuxer();
+        p_.checkDiscSpace = muxer && std::string_view(muxer->name()) == "asfmux";
+        return runPasses();
+    });
+    if (p_.twoPass) {
+        const int forgotten = guarded([this] { return forgetStatistics(), QvStatus::ok; });
+        if (result == QvStatus::ok) result = forgotten;
+    }
+    return result;
+}
+
+// The last resort where not even the end of a run has the memory that it needs: all is closed, and the
+// application learns it.
 int QvTranscodeRun::breakOff() {
-    if (number_ == p_.runNumber && p_.running) p_.endRun(QvTranscoder::connected);
+    if (number_ == p_.runNumber && p_.running) {
+        giveUp();
+        p_.endRun(QvTranscoder::connected);
+    }
     try {
         t_.cbDone(QvStatus::outOfMemory);
     } catch (...) {

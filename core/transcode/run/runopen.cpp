@@ -1,4 +1,5 @@
 // The start of a run: from a task with links to open inputs, links and output.
+#include <new>
 #include <string>
 
 #include "core/arch/qvassert.h"
@@ -132,8 +133,16 @@ int QvTranscodeRun::seekInputs() {
 
 int QvTranscodeRun::closeLinks(const QvTask& task) {
     int result = QvStatus::ok;
-    const auto links = task.links();
-    for (int i = 0; i < links.size(); ++i) result |= links.at(i)->close();
+    for (int i = 0; i < task.nrLinks(); ++i) {
+        try {
+            result |= task.getLink(i)->close();
+        } catch (const std::bad_alloc&) {
+            result |= QvStatus::outOfMemory;
+        } catch (const QvException& failure) {
+            qv_dbg()->error("Transcoder: %s", failure.what());
+            result |= QvStatus::failed;
+        }
+    }
     return result;
 }
 

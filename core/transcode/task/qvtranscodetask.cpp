@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cstdarg>
 #include <cstdio>
+#include <new>
 
 #include "core/arch/formattext_p.h"
 #include "core/arch/qvassert.h"
@@ -43,7 +44,11 @@ int QvTask::setError(int code, const char* format, ...) {
     va_end(args);
     const char* const text = formatted.text();
     errorCode_ = code;
-    errorText_ = text;
+    try {
+        errorText_ = text;
+    } catch (const std::bad_alloc&) {
+        errorText_.clear();  // a failure is never told by throwing
+    }
     qv_dbg()->log(2, "Task: %s (%d)", text, code);
     return code;
 }

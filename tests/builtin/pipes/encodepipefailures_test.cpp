@@ -1,4 +1,4 @@
-// Each member of the pipe fails at each point, as a status and as a broken contract.
+// Each member of the pipe fails at each point, as a status, as a broken contract and for want of memory.
 
 #include "core/encode/qvencodepipe.h"
 #include "tests/support/checks.h"
@@ -22,6 +22,8 @@ struct PipeFailure : testing::Test {
         try {
             return action();
         } catch (const QvAssertFailure&) {
+            return FailingOutputs::failure;
+        } catch (const std::bad_alloc&) {
             return FailingOutputs::failure;
         }
     }
@@ -51,7 +53,7 @@ struct PipeFailure : testing::Test {
             const bool aborting = call.ends_with(".abort");
             outputs_.calls.clear();
             EXPECT_EQ((aborting ? pipe_->abort() : pipe_->close()) != 0, !atWrite);
-            EXPECT_TRUE(atWrite || *pipe_->errorDesc());
+            EXPECT_TRUE(atWrite || outputs_.how == FailingOutputs::noMemory || *pipe_->errorDesc());
             for (const std::string member : {"filesink", "rawmux", "rawvenc", "rawaenc"})
                 EXPECT_EQ(std::count(outputs_.calls.begin(), outputs_.calls.end(),
                                      member + (aborting ? ".abort" : ".close")),
@@ -70,9 +72,10 @@ struct PipeFailure : testing::Test {
 TEST_F(PipeFailure, IsToldAndLeavesThePipeUsable) {
     for (const std::string member : {"filesink", "rawmux", "rawvenc", "rawaenc"})
         for (const std::string what : {".open", ".close", ".abort", ".write"})
-            for (const auto how : {FailingOutputs::status, FailingOutputs::assertion}) {
+            for (const auto how :
+                 {FailingOutputs::status, FailingOutputs::assertion, FailingOutputs::noMemory}) {
                 if (what == ".write" && !member.ends_with("enc")) continue;
-                SCOPED_TRACE(member + what + (how == FailingOutputs::status ? "" : " by assertion"));
+                SCOPED_TRACE(testing::Message() << member << what << ", way " << how);
                 outputs_.how = how;
                 run(member + what);
                 expectWorkingPipe();

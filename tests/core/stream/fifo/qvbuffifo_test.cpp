@@ -88,6 +88,23 @@ TEST(QvBufStreamFifo, SizesThatMakeNoRingAreAsserted) {
     }
 }
 
+// A caller can tell want of memory from sizes that never fit.
+TEST(QvBufStreamFifo, WantOfMemoryIsAnAssertionOfItsOwn) {
+    NoMemory none;
+    const PlatformScope scope(none);
+    QvBufStreamFifo fifo;
+    EXPECT_EQ(failureOf([&] { fifo.init(ring(100, 10)); }), "Fifo init failed");
+    EXPECT_THROW(fifo.init(ring(100, 10)), QvMemoryFailure);
+    try {
+        fifo.init(ring(10, 11));
+        FAIL();
+    } catch (const QvMemoryFailure&) {
+        FAIL() << "these sizes never fit";
+    } catch (const QvAssertFailure&) {
+    }
+    EXPECT_FALSE(fifo.inited());
+}
+
 TEST_F(Ring, CopyingInTakesTheLastByteAndRequestsDoNot) {
     ASSERT_EQ(copyIn(in, "0123456789abcdef"), 16u);
     ASSERT_EQ(take(out, 8), "01234567");

@@ -1,3 +1,4 @@
+#include <new>
 #include <thread>
 
 #include "builtin/modules.h"
@@ -90,6 +91,12 @@ TEST_F(Transcoder, EveryEndHasItsOwnResult) {
          -78, -1, "close done-78"},
         {[](LinkedJob& j) { j.t.setParam("closeEncoder", 0); }, 0, 0, "0.50 done0"},
         {[](LinkedJob& j) { j.t.onProcess = []() -> int { throw 5; }; }, -1, -1, "abort done-1"},
+        {[](LinkedJob& j) { j.t.onProcess = []() -> int { throw std::bad_alloc(); }; }, -3, -1,
+         "abort done-3"},
+        {[](LinkedJob& j) { j.t.onProcess = []() -> int { throw QvMemoryFailure("x"); }; }, -3, -1,
+         "abort done-3"},
+        {[](LinkedJob& j) { j.t.onProcess = []() -> int { throw QvAssertFailure("x"); }; }, -1, -1,
+         "abort done-1"},
     };
     for (const auto& row : rows) {
         SCOPED_TRACE(&row - rows);
