@@ -1,4 +1,5 @@
 // Stopping in the middle: the status says which signal, and nothing is left that looks whole.
+#include <sched.h>
 #include <sys/stat.h>
 
 #include "tests/system/tool.h"
@@ -78,6 +79,119 @@ TEST_F(Signal, WhatIsIgnoredStaysIgnored) {
     ASSERT_TRUE(run.waitFor("\"event\":\"progress\""));
     run.signal(SIGTERM);
     EXPECT_EQ(run.finish().status, 143);
+}
+
+TEST_F(Signal, OnRequestALineOfTheState) {
+    Process run(words({"transcode", kEndless, "-o", "out.raw"}), here());
+    const int reader = openPipe();
+    Process held(words({"transcode", kLarge, "-o", "pipe.raw", "--progress", "json"}), here());
+    ASSERT_TRUE(hasData(reader));
+    held.signal(SIGUSR1);  // its worker waits for the reader
+    EXPECT_TRUE(held.waitFor("\"event\":\"progress\""));
+    // Until its handler is there the program does what any does with this signal: wait for the folder of the
+    // run.
+    while (listing().size() < 2) sched_yield();
+    for (int i = 0; i < 3; ++i) {
+        run.signal(SIGUSR1);
+        EXPECT_TRUE(run.waitFor("running\n"));
+    }
+    run.signal(SIGTERM);
+    const Outcome o = run.finish();
+    EXPECT_EQ(o.status, 143);
+    EXPECT_THAT(o.err, testing::ContainsRegex("tarsel: +[0-9.]+ %  frame [0-9]+  [0-9.]+x.*  running\n"));
+    close(reader);
+}
+
+TEST_F(Signal, ReachesTheCommandOfPost) {
+    const Words job = {"transcode", "testgen:size=64x64,duration=0.1,audio=0", "-o", "out.raw", "-y",
+                       "--post"};
+    for (const int signal : {SIGTERM, SIGINT}) {
+        // What the shell has started gets it too; the shell writes only after that has ended.
+        const std::string name = signal == SIGTERM ? "TERM" : "INT";
+        Process run(words(job + Words{"trap 'echo got " + name + "' " + name +
+                                      "; echo started; sleep 1000; echo awake; exit 0"}),
+                    here());
+        ASSERT_TRUE(run.waitFor("started"));
+        run.signal(signal);
+        const Outcome o = run.finish();
+        EXPECT_EQ(o.status, 128 + signal) << o.err;
+        EXPECT_THAT(o.out, testing::HasSubstr("got " + name));
+        EXPECT_THAT(o.err, testing::HasSubstr("'out.raw' is complete"));
+        EXPECT_EQ(size("out.raw"), 2 * 64 * 64 * 4);
+    }
+}
+
+// The file has its name and only the report is left, for which the full pipe has no room.
+TEST_F(Signal, AfterTheResultHasItsNameChangesNothing) {
+    int full[2];
+    ASSERT_EQ(pipe2(full, O_NONBLOCK), 0);
+    const std::string page(4096, '.');
+    while (write(full[1], page.data(), page.size()) > 0) {
+    }
+    fcntl(full[1], F_SETFL, 0);
+    const std::string line = "exec '" + program() +
+                             "' transcode testgen:size=64x64,duration=0.1,audio=0 -o out.raw 2>&" +
+                             std::to_string(full[1]);
+    Process run({"sh", "-c", line}, here());
+    while (size("out.raw") < 0) sched_yield();
+    run.signal(SIGTERM);
+    std::string told;
+    for (char block[4096]; told.find("wrote 'out.raw'") == std::string::npos;) {
+        pollfd data{full[0], POLLIN, 0};
+        ASSERT_EQ(poll(&data, 1, Process::kPatience), 1);
+        const ssize_t got = read(full[0], block, sizeof block);
+        ASSERT_GT(got, 0);
+        told.append(block, static_cast<size_t>(got));
+    }
+    EXPECT_EQ(run.finish().status, 0);
+    close(full[0]);
+    close(full[1]);
+}
+
+// An input that becomes shorter under the run: what is read as silence or not at all is never passed off as
+// content.
+TEST_F(Signal, AnInputThatShrinksIsDamage) {
+    const struct {
+        Words job;
+        std::string input, output;
+        std::uintmax_t before, after, taken;  // bytes; of the output
+    } rows[] = {
+        {asYuv({"transcode", "in.yuv", "-o", "out.raw"}), "in.yuv", "out.raw", kFrame * 400000,
+         kFrame * 10 + 5, kFrame * 10},
+        {{"transcode", "in.wav", "-o", "out.wav"},
+         "in.wav",
+         "out.wav",
+         44 + 1'600'000'000,
+         44 + 4000,
+         80 + 4000},
+    };
+    for (const auto& row : rows)
+        for (const bool partial : {false, true}) {
+            SCOPED_TRACE(row.input + (partial ? " --accept-partial" : ""));
+            if (row.input == "in.wav")
+                folder.write(row.input, riff(wavChunk("fmt ", wavFormat(1, 2, 48000, 16)) + "data" +
+                                             std::string("\0\x10\x5E\x5F", 4)));
+            else
+                folder.write(row.input, "");
+            std::filesystem::resize_file(folder.file(row.input), row.before);
+            Process run(words(row.job + Words{"--progress", "json"} +
+                              (partial ? Words{"--accept-partial"} : Words{})),
+                        here());
+            ASSERT_TRUE(run.waitFor("\"event\":\"start\"")) << run.finish().err;
+            run.signal(SIGSTOP);
+            std::filesystem::resize_file(folder.file(row.input), row.after);
+            run.signal(SIGCONT);
+            const Outcome o = run.finish();
+            EXPECT_EQ(o.status, partial ? 0 : 3) << o.err;
+            EXPECT_THAT(o.err, testing::HasSubstr("became shorter while it was read"));
+            std::set<std::string> expected{row.input};
+            if (partial) {
+                expected.insert(row.output);
+                EXPECT_EQ(std::filesystem::file_size(folder.file(row.output)), row.taken);
+            }
+            EXPECT_EQ(listing(), expected);
+            for (const auto& name : listing()) std::filesystem::remove_all(folder.file(name));
+        }
 }
 
 }  // namespace
