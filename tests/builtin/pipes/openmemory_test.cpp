@@ -2,6 +2,7 @@
 // memory.
 #include <functional>
 
+#include "core/arch/qvexception.h"
 #include "core/preset/qvprofile.h"
 #include "core/stream/qvbufstrm.h"
 #include "tests/support/failing_memory.h"
