@@ -41,10 +41,18 @@ bool RawMux::hasSeveral() const { return nrStreams(qvVideoStream) > 1 || nrStrea
 
 Any RawMux::outputName(int type, int nr) const {
     QV_ASSERT_MSG(filename_.isText(), nameMissing);
+    if (exactName_) return filename_;
     auto& output = *stream(type, nr);
     Any name = QvFile::stripExt(filename_);
     if (hasSeveral()) name = Any::strcat(name, Any::sprintf("#%02d", nr));
     return Any::strcat(Any::strcat(name, "."), qvStreamExtension(output, ""));
+}
+
+bool RawMux::makesSeveral() const {
+    int enabled = 0;
+    for (const int type : {qvVideoStream, qvAudioStream})
+        for (int nr = 0; nr < nrStreams(type); ++nr) enabled += stream(type, nr)->enabled() ? 1 : 0;
+    return enabled > 1 || splitVideo_ || splitAudio_;
 }
 
 // Streams whose names agree would write over each other.
@@ -66,6 +74,8 @@ int RawMux::open() {
     QV_ASSERT_MSG(anyEnabled(), "No enabled streams - use QvTranscoder::link()");
     QV_ASSERT_MSG(outStream(), "Output not set");
     outputs_.clear();
+    if (exactName_ && makesSeveral())
+        return setError(QvStatus::failed, "One output of an exact name takes one stream in one piece");
     if (checkNames() != 0)
         return setError(QvStatus::failed,
                         "Two streams would be written to one file, their extensions are equal");

@@ -12,6 +12,8 @@
 //
 // Parameters:
 //   "filename"       text    the name that the others are made from
+//   "exactName"      bool    the only stream is written to "filename" as it is, nothing appended: for a name
+//                            that is a pipe or a device, "/dev/stdout" for one
 //   "splitVideo"     bool    one file for each picture of a raw encoder: a#0.raw, a#1.raw ...
 //   "splitAudio"     bool    one WAV file for each channel of a raw encoder: a#00.wav, a#01.wav ...
 //   "rawAsPng"       bool    with splitVideo, PNG pictures
@@ -44,6 +46,7 @@ class RawMux : public OwnFilesMuxer {
 
     bool hasSeveral() const;
     Any outputName(int type, int nr) const;
+    bool makesSeveral() const;
     int checkNames() const;
     int openAll();
     int openAudio(int nr);
@@ -57,5 +60,6 @@ class RawMux : public OwnFilesMuxer {
     bool splitVideo_ = false;
     bool splitAudio_ = false;
     bool rawAsPng_ = false;
+    bool exactName_ = false;
     std::vector<std::unique_ptr<Output>> outputs_;  // of the last run
 };

@@ -27,6 +27,7 @@ struct RawMuxParams {
             {"splitVideo", &Mux::splitVideo_, qvParamStored},
             {"splitAudio", &Mux::splitAudio_, qvParamStored},
             {"filename", &Mux::filename_},
+            {"exactName", &Mux::exactName_},
             {"type", {}, qvParamIgnored},
             {"_totalFrames", &Mux::totalFrames_},
             {"rawMux", Access{nullptr, [](M, Any& v) { v = 1; }}},

@@ -16,6 +16,7 @@
 #include <cstdio>
 #include <ctime>
 #include <functional>
+#include <memory>
 #include <string>
 #include <string_view>
 #include <thread>
@@ -59,6 +60,8 @@ struct QvLibrary {
     std::string reason;  // the end of a sentence that begins with the file: "is empty"
 };
 
+class QvCancel;
+
 enum class QvFontFace { sans, sansItalic, sansBold, monospaceBold };
 
 class QV_API QvPlatform {
@@ -71,6 +74,11 @@ class QV_API QvPlatform {
     // are refused, and child processes do not inherit the file. The caller reads, writes and closes it with
     // the C library; a substitute that wants these to fail returns a stream of its own making.
     virtual std::FILE* openFile(const char* name, const char* mode);
+    // openFile for writing ("wb") of what may be no file. A pipe, a socket, a terminal, a device and what is
+    // named by one of this process's own descriptors ("/dev/stdout", "/dev/fd/3") becomes a stream, which
+    // `isStream` tells: it is written from where it stands, can't be sought, and a wait for its reader ends
+    // with ECANCELED after a request of `cancel` (null: never). Inherited descriptors keep their flags.
+    virtual std::FILE* openOutput(const char* name, const std::shared_ptr<QvCancel>& cancel, bool& isStream);
     // A file descriptor of the C runtime for libraries that take nothing else, or -1. Writing creates or
     // truncates. The library that takes it closes it; closeDescriptor is for one that was not taken.
     virtual int openDescriptor(const char* name, bool writing);

@@ -89,6 +89,16 @@ QvEncodePipe* QvEncodePipe::create() {
     return static_cast<QvEncodePipe*>(qv_registry()->newCodec("encpipe"));
 }
 
+void QvEncodePipe::setCancel(const std::shared_ptr<QvCancel>& cancel) {
+    QvMuxer* muxer = getMuxer();
+    for (const int type : {qvVideoStream, qvAudioStream, qvSubpicStream})
+        for (int nr = 0; muxer && nr < muxer->nrStreams(type); ++nr)
+            muxer->stream(type, nr)->setCancel(cancel);
+    QvSink* end = sink();
+    if (QvBufStream* stream = end && end->getState() != stateCreated ? end->stream() : nullptr)
+        stream->setCancel(cancel);
+}
+
 int QvEncodePipe::flush() {
     int result = 0;
     if (auto* muxer = getMuxer()) result |= muxer->flush();

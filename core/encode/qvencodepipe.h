@@ -19,6 +19,7 @@
 
 class FiltersState;
 class QvAuQueuePoll;
+class QvCancel;
 class QvPreset;
 
 // One output stream of a pipe. The pipe makes and deletes it; others read.
@@ -128,6 +129,10 @@ class QV_API QvEncodePipe : public QvCodec {
 
     void* getInterface(int kind) const override;
     using QvCodec::getParam;
+
+    // Gives `cancel` to the streams of the multiplexer and the sink, for the next open(): see
+    // QvBufStream::setCancel. QvTranscoder does it by itself.
+    void setCancel(const std::shared_ptr<QvCancel>& cancel);
 
     int nrVideoStreams() const { return nrStreams(qvVideoStream); }
     int nrAudioStreams() const { return nrStreams(qvAudioStream); }

@@ -23,9 +23,9 @@ constexpr size_t gatheredBytes = size_t{1} << 16;
 // A file of samples, gathered into large blocks: those of a turn are a few kilobytes.
 class SampleFile {
   public:
-    bool open(const QvWideString& name) {
+    bool open(const QvWideString& name, const std::shared_ptr<QvCancel>& cancel) {
         name_ = name;
-        if (!file_.open(name, "wb")) return false;
+        if (!file_.openOutput(name, cancel)) return false;
         file_.setUnbuffered();
         gathered_.reserve(gatheredBytes);
         return true;
@@ -53,6 +53,9 @@ class SampleFile {
         return file_.close() && flushed;
     }
     const QvWideString& name() const { return name_; }
+    bool isOpen() const { return file_.isOpen(); }
+    bool isStream() const { return file_.isStream(); }
+    uint64_t written() const { return file_.written(); }
     int error() const { return file_.error(); }
 
   private:
@@ -145,17 +148,29 @@ Any QvBsSplitAudio::_channelFileName(const Any& name, int channel) {
     return QvFile::joinPath(QvFile::getPath(name), file);
 }
 
+// Of a stream, where no one can go back to it: with the size that is expected.
+std::array<unsigned char, wavHeaderBytes> QvBsSplitAudio::streamHeader() {
+    const WavFormat format = wav_->fileFormat();
+    const Any& expected = params().get("expectedSamples");
+    const long long samples = expected.isInt() ? expected.toInt64() : -1;
+    const auto sampleBytes = static_cast<uint64_t>(format.sampleBytes());
+    const bool known = samples >= 0 && static_cast<uint64_t>(samples) < wavLengthUnknown / 2 / sampleBytes;
+    return wavHeader(
+        format, known ? wavHeaderBytes + static_cast<uint64_t>(samples) * sampleBytes : wavLengthUnknown);
+}
+
 // Appends the file to the list, with room for the header in it.
 bool QvBsSplitAudio::openFile(const Any& name) {
-    static constexpr unsigned char room[wavHeaderBytes] = {};
     const std::string narrow = qv_os_name(name);
     auto& entry = *wav_->files.emplace_back(std::make_unique<Wav::File>());
-    if (!entry.file.open(qv_wide_name(narrow))) {
+    if (!entry.file.open(qv_wide_name(narrow), cancel())) {
         failure()->note(entry.file.error(), "Can not open file", entry.file.name());
         qv_log()->error("[split writer] Failed to open %s.", narrow.c_str());
         return false;
     }
-    if (entry.file.write(room, sizeof room) && entry.file.flush()) return true;
+    std::array<unsigned char, wavHeaderBytes> room{};
+    if (entry.file.isStream()) room = streamHeader();
+    if (entry.file.write(room.data(), room.size()) && entry.file.flush()) return true;
     failure()->note(entry.file.error(), "Failed to write to", entry.file.name());
     qv_log()->error("[split writer] Failed to write to %s.", narrow.c_str());
     entry.file.close();
@@ -277,7 +292,10 @@ bool QvBsSplitAudio::writeItem(int file, const unsigned char* data, unsigned byt
 
 bool QvBsSplitAudio::closeFile(int file) {
     auto& entry = *wav_->files[static_cast<size_t>(file)];
-    if (entry.file.close()) return true;
+    if (!entry.file.isOpen()) return true;
+    const bool closed = entry.file.close();
+    failure()->countTaken(entry.file.written());
+    if (closed) return true;
     failure()->report(entry.file.error(), "Failed to write to", entry.file.name());
     return false;
 }
@@ -297,5 +315,6 @@ void QvBsSplitAudio::onStreamEnd() {
 }
 
 void QvBsSplitAudio::_writeWavHeaders() {
-    for (const auto& entry : wav_->files) writeWavHeader(entry->file.name(), wav_->fileFormat(), *failure());
+    for (const auto& entry : wav_->files)
+        if (!entry->file.isStream()) writeWavHeader(entry->file.name(), wav_->fileFormat(), *failure());
 }

@@ -186,7 +186,7 @@ bool QvBsSplitVideo::writeFile(bufstream* ring, unsigned bytes, const Any& name)
     const std::string narrow = qv_os_name(name);
     const QvWideString wide = qv_wide_name(narrow);
     StdFile file;
-    if (!file.open(wide, "wb")) {
+    if (!file.openOutput(wide, cancel())) {
         failure()->note(file.error(), "Can not open file", wide);
         qv_log()->error("[split writer] Failed to open %s.", narrow.c_str());
         return false;

@@ -6,6 +6,7 @@
 // ioError().
 #pragma once
 
+#include <array>
 #include <memory>
 
 #include "core/stream/fifo/qvbuffifo.h"
@@ -67,6 +68,9 @@ class QV_API QvBsSplitVideo : public QvBufStreamFifoCb {
 //
 // The header is written when STREAM_END_CODE comes; before that the file has 80 zero bytes in its place. Size
 // fields that a file beyond 4 GiB can't state are 0xFFFFFFFF, with a warning; the samples are all there.
+//
+// A pipe, a socket or a device gets its header at once. Its sizes are those of "expectedSamples" (Int32 or
+// Int64, of each channel), or 0xFFFFFFFF without that: readers take the stream to its end then.
 class QV_API QvBsSplitAudio : public QvBufStreamFifoCb {
   public:
     static constexpr int maxFiles = 32;
@@ -90,6 +94,7 @@ class QV_API QvBsSplitAudio : public QvBufStreamFifoCb {
     int initPlain(const AnyDict& params);
     bool openFiles();
     bool openFile(const Any& name);
+    std::array<unsigned char, 80> streamHeader();
     static Any _channelFileName(const Any& name, int channel);
     void _onAudioBytes(unsigned bytes);
     bool writeInterleaved(bufstream* ring, unsigned bytes);

@@ -75,7 +75,7 @@ bool writeWavHeader(const QvWideString& name, const WavFormat& format, QvIoFailu
     }
     if (!file.close()) ok = false;
     if (!ok) failure.note(file.error(), "Failed to write the header of", name);
-    if (ok && static_cast<uint64_t>(length) - 8 > largestSize)
+    if (ok && static_cast<uint64_t>(length) > largestSize + 8)
         qv_log()->warning(
             "[split writer] %s is larger than a WAV header can state (4 GiB): its size fields are "
             "0xFFFFFFFF, all samples are in the file.",

@@ -21,7 +21,9 @@ constexpr unsigned wavHeaderBytes = 80;
 // True for what the header's fields can state and the buffers can hold.
 bool wavFormatIsLegal(const WavFormat& format);
 
-// The header of a file of `fileBytes`, these 80 included. A size that does not fit is 0xFFFFFFFF.
+// The header of a file of `fileBytes`, these 80 included. A size that does not fit is 0xFFFFFFFF, which
+// readers take for a stream of unknown length.
+constexpr uint64_t wavLengthUnknown = UINT64_MAX;
 std::array<unsigned char, wavHeaderBytes> wavHeader(const WavFormat& format, uint64_t fileBytes);
 
 // Writes the header over the first 80 bytes of the finished file. A file beyond 4 GiB is told to the user as

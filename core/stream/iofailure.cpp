@@ -19,7 +19,7 @@ bool QvIoFailure::keep(int code, const char* what, const QvWideString& name) {
 }
 
 void QvIoFailure::report(int code, const char* what, const QvWideString& name) {
-    if (keep(code, what, name)) qv_log()->logs(QvLogMask::error, text_.c_str());
+    if (keep(code, what, name) && code != ECANCELED) qv_log()->logs(QvLogMask::error, text_.c_str());
 }
 
 void QvIoFailure::note(int code, const char* what, const QvWideString& name) { keep(code, what, name); }
@@ -27,4 +27,5 @@ void QvIoFailure::note(int code, const char* what, const QvWideString& name) { k
 void QvIoFailure::clear() {
     code_ = 0;
     text_.clear();
+    taken_ = 0;
 }

@@ -1,6 +1,7 @@
 // The first failure of a stream's input or output, kept for whoever asks after the work.
 #pragma once
 
+#include <cstdint>
 #include <string>
 
 #include "core/arch/api.h"
@@ -12,7 +13,8 @@
 class QV_API QvIoFailure {
   public:
     // Keeps the first one: "what 'name': reason" with the system's text of `code`, an errno value (0 counts
-    // as EIO). report() also tells the user, through qv_log() as an error; note() does not.
+    // as EIO). report() also tells the user, through qv_log() as an error, unless the user asked for it
+    // (ECANCELED); note() does not.
     void report(int code, const char* what, const QvWideString& name);
     void note(int code, const char* what, const QvWideString& name);
     void clear();
@@ -20,9 +22,14 @@ class QV_API QvIoFailure {
     int code() const { return code_; }
     const std::string& text() const { return text_; }
 
+    // Bytes that were written to files which are closed.
+    void countTaken(std::uint64_t bytes) { taken_ += bytes; }
+    std::uint64_t taken() const { return taken_; }
+
   private:
     bool keep(int code, const char* what, const QvWideString& name);
 
     int code_ = 0;
     std::string text_;
+    std::uint64_t taken_ = 0;
 };

@@ -65,6 +65,7 @@ void QvBufStream::unlock() { lock_->leave(); }
 
 int QvBufStream::ioError() const { return failure_->code(); }
 std::string QvBufStream::ioErrorText() const { return failure_->text(); }
+unsigned long long QvBufStream::ioTaken() const { return failure_->taken(); }
 
 int QvBufStream::int32Param(const char* name, int fallback) {
     const Any& stored = params_.get(name);

@@ -11,6 +11,7 @@
 #include "core/value/anycontainer.h"
 #include "core/value/ptrlist.h"
 
+class QvCancel;
 class QvCodec;
 class QvIoFailure;
 
@@ -74,6 +75,12 @@ class QV_API QvBufStream {
     // nothing). Whoever gives a file its final name asks this after destroy().
     int ioError() const;
     std::string ioErrorText() const;
+    // Bytes that the system has taken since init, in files that are closed again.
+    unsigned long long ioTaken() const;
+
+    // What ends a wait for the reader of a pipe, socket or terminal that is opened from now on; see
+    // QvCancel. Null, as at first: nothing does. QvTranscoder gives its own to the streams of its output.
+    void setCancel(std::shared_ptr<QvCancel> cancel) { cancel_ = std::move(cancel); }
 
   protected:
     AnyDict& params() { return params_; }
@@ -82,8 +89,13 @@ class QV_API QvBufStream {
     // The entry as Int32; if it has another type or is absent, `fallback`, which is stored.
     int int32Param(const char* name, int fallback);
     const std::shared_ptr<QvIoFailure>& failure() const { return failure_; }
-    // Failures of `inner`, which stands behind this stream, count as this one's.
-    void shareFailure(QvBufStream& inner) const { inner.failure_ = failure_; }
+    const std::shared_ptr<QvCancel>& cancel() const { return cancel_; }
+    // Failures of `inner`, which stands behind this stream, count as this one's, and what ends the waits of
+    // this one ends those of `inner`.
+    void shareFailure(QvBufStream& inner) const {
+        inner.failure_ = failure_;
+        inner.cancel_ = cancel_;
+    }
 
   private:
     std::shared_ptr<QVThreads::QvCriticalSection> lock_;
@@ -93,4 +105,5 @@ class QV_API QvBufStream {
     AnyDict params_;
     bool enabled_ = true;
     std::shared_ptr<QvIoFailure> failure_;
+    std::shared_ptr<QvCancel> cancel_;
 };

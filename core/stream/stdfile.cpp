@@ -1,6 +1,7 @@
 #include <cerrno>
 
 #include "core/engine/files/qvfileutil.h"
+#include "core/engine/log/loggedopen_p.h"
 #include "core/stream/stdfile_p.h"
 #include "core/value/any.h"
 
@@ -9,11 +10,23 @@ bool StdFile::check(bool ok) {
     return ok;
 }
 
-bool StdFile::open(const QvWideString& name, const char* mode) {
+void StdFile::begin() {
     close();
     error_ = 0;
+    isStream_ = false;
+    written_ = 0;
     errno = 0;
+}
+
+bool StdFile::open(const QvWideString& name, const char* mode) {
+    begin();
     file_ = static_cast<std::FILE*>(qvfopen(Any(name.c_str()), mode));
+    return check(file_ != nullptr);
+}
+
+bool StdFile::openOutput(const QvWideString& name, const std::shared_ptr<QvCancel>& cancel) {
+    begin();
+    file_ = qvOpenOutputLogged(Any(name.c_str()), cancel, isStream_);
     return check(file_ != nullptr);
 }
 
@@ -25,6 +38,7 @@ size_t StdFile::writeSome(const void* data, size_t bytes) {
     errno = 0;
     const size_t done = file_ ? std::fwrite(data, 1, bytes, file_) : 0;
     check(done == bytes);
+    written_ += done;
     return done;
 }
 

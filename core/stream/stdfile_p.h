@@ -2,9 +2,13 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
 #include <cstdio>
+#include <memory>
 
 #include "core/arch/widename.h"
+
+class QvCancel;
 
 class StdFile {
   public:
@@ -15,6 +19,10 @@ class StdFile {
 
     // Results are false, or short, on failure; error() then has the reason as an errno value.
     bool open(const QvWideString& name, const char* mode);
+    // Creates or truncates what is written from its start to its end; see QvPlatform::openOutput.
+    bool openOutput(const QvWideString& name, const std::shared_ptr<QvCancel>& cancel);
+    // Opened by openOutput and no file: it can't be sought, nor opened again to change what was written.
+    bool isStream() const { return isStream_; }
     // Each write goes to the system as it is; to be called before the first.
     void setUnbuffered();
     bool isOpen() const { return file_ != nullptr; }
@@ -30,10 +38,14 @@ class StdFile {
     bool close();
     bool failedRead() const { return file_ && std::ferror(file_); }
     int error() const { return error_; }
+    uint64_t written() const { return written_; }  // bytes since it was opened
 
   private:
+    void begin();
     bool check(bool ok);
 
     std::FILE* file_ = nullptr;
     int error_ = 0;
+    bool isStream_ = false;
+    uint64_t written_ = 0;
 };

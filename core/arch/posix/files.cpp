@@ -113,7 +113,7 @@ long long QvPlatform::freeSpace(const char* name) {
         if (errno != ENOENT && errno != ENOTDIR) return -1;
         place = folderAbove(place);
     }
-    if (place.empty()) return -1;
+    if (place.empty() || facts.f_blocks == 0) return -1;  // pipes and the like have no disc
     const unsigned long long bytes = 1ull * facts.f_bavail * facts.f_frsize;
     constexpr auto most = static_cast<unsigned long long>(std::numeric_limits<long long>::max());
     return static_cast<long long>(bytes < most ? bytes : most);

@@ -27,18 +27,20 @@ QvWideString wideNumber(int number, int width) {
 
 }  // namespace
 
-FileWriter::FileWriter(const QvWideString& name, unsigned size, std::shared_ptr<QvIoFailure> failure)
-    : buffer_(size), capacity_(size), path_(name), failure_(std::move(failure)) {}
+FileWriter::FileWriter(const QvWideString& name, unsigned size, std::shared_ptr<QvIoFailure> failure,
+                       std::shared_ptr<QvCancel> cancel)
+    : buffer_(size), capacity_(size), path_(name), failure_(std::move(failure)), cancel_(std::move(cancel)) {}
 
 std::unique_ptr<FileWriter> FileWriter::open(const QvWideString& name, unsigned size,
-                                             std::shared_ptr<QvIoFailure> failure) {
+                                             std::shared_ptr<QvIoFailure> failure,
+                                             std::shared_ptr<QvCancel> cancel) {
     if (name.empty() || name.size() > longestName) return nullptr;
-    std::unique_ptr<FileWriter> writer(new FileWriter(name, size, std::move(failure)));
+    std::unique_ptr<FileWriter> writer(new FileWriter(name, size, std::move(failure), std::move(cancel)));
     if (!writer->buffer_.data()) {
         writer->failure_->note(ENOMEM, "No memory to write", name);
         return nullptr;
     }
-    if (writer->file_.open(name, "wb")) return writer;
+    if (writer->file_.openOutput(name, writer->cancel_)) return writer;
     writer->failure_->note(writer->file_.error(), "Can not open file", name);
     return nullptr;
 }
@@ -59,7 +61,10 @@ bool FileWriter::flushBuffer() {
 bool FileWriter::writeOut() { return flushBuffer() && (file_.flush() || fail()); }
 
 // Closing may be where the C library finds out that the disc is full.
-bool FileWriter::closeFile() { return file_.close() || broken_ || fail(); }
+bool FileWriter::closeFile() {
+    if (file_.isOpen()) failure_->countTaken(file_.written());
+    return file_.close() || broken_ || fail();
+}
 
 unsigned char* FileWriter::request(unsigned n) {
     if (broken_ || n > capacity_) return nullptr;
@@ -123,7 +128,7 @@ unsigned FileWriter::split() {
     if (stem_.empty()) takeStem();
     if (splits_ < 0 || splits_ == INT_MAX) return BUFSTREAM_FAILED;
     path_ = stem_ + wideNumber(splits_ + 1, numberWidth(splits_)) + suffix_;
-    if (!file_.open(path_, "wb")) {
+    if (!file_.openOutput(path_, cancel_)) {
         broken_ = true;
         failure_->report(file_.error(), "Can not open file", path_);
         return BUFSTREAM_FAILED;

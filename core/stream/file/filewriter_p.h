@@ -17,8 +17,10 @@
 class FileWriter {
   public:
     // Null if the file can't be opened for writing or there is no memory for the buffer.
+    // `cancel`, which may be null, ends waits for the reader of a stream.
     static std::unique_ptr<FileWriter> open(const QvWideString& name, unsigned size,
-                                            std::shared_ptr<QvIoFailure> failure);
+                                            std::shared_ptr<QvIoFailure> failure,
+                                            std::shared_ptr<QvCancel> cancel);
 
     unsigned usable() const { return capacity_ - fill_; }
     unsigned char* request(unsigned n);
@@ -31,11 +33,15 @@ class FileWriter {
     unsigned split();
     void done(int abort);
 
+    // What was written can't be changed any more.
+    bool isStream() const { return file_.isStream(); }
+
     // Brings what is buffered to the file system. False on failure.
     bool writeOut();
 
   private:
-    FileWriter(const QvWideString& name, unsigned size, std::shared_ptr<QvIoFailure> failure);
+    FileWriter(const QvWideString& name, unsigned size, std::shared_ptr<QvIoFailure> failure,
+               std::shared_ptr<QvCancel> cancel);
     bool flushBuffer();
     bool fail();
     bool closeFile();
@@ -54,4 +60,5 @@ class FileWriter {
     bool broken_ = false;
     NavCollector nav_;
     std::shared_ptr<QvIoFailure> failure_;
+    std::shared_ptr<QvCancel> cancel_;
 };

@@ -71,12 +71,13 @@ int QvFileBufStream::openOutput(const QvWideString& name) {
     using Record = RecordOf<FileWriter>;
     const unsigned size = static_cast<unsigned>(params().get("size").asInt32());
     records_->writing = true;
-    records_->file = Record::make(FileWriter::open(name, size, failure()), BUFSTREAM_WRITER);
+    records_->file = Record::make(FileWriter::open(name, size, failure(), cancel()), BUFSTREAM_WRITER);
     if (!records_->file) {
         qv_dbg()->error("Can not open file %s", qv_narrow_name(name.data(), name.size()).c_str());
         return QvStatus::failed;
     }
-    records_->patch = seekPatchNew(records_->file, tellObservers, this, failure());
+    const bool patchable = !Record::of(records_->file)->isStream();
+    records_->patch = seekPatchNew(records_->file, patchable, tellObservers, this, failure());
     return QvStatus::ok;
 }
 

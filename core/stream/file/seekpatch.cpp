@@ -20,9 +20,14 @@ struct Patch {
 
 class SeekPatch {
   public:
-    SeekPatch(bufstream* inner, const QvWideString& name, AuxInfoCallback callback, void* context,
-              std::shared_ptr<QvIoFailure> failure)
-        : inner_(inner), name_(name), callback_(callback), context_(context), failure_(std::move(failure)) {}
+    SeekPatch(bufstream* inner, const QvWideString& name, bool patchable, AuxInfoCallback callback,
+              void* context, std::shared_ptr<QvIoFailure> failure)
+        : inner_(inner),
+          name_(name),
+          patchable_(patchable),
+          callback_(callback),
+          context_(context),
+          failure_(std::move(failure)) {}
 
     unsigned usable() { return inner_->usable(inner_); }
     unsigned char* request(unsigned n) { return inner_->request(inner_, n); }
@@ -41,6 +46,7 @@ class SeekPatch {
     std::vector<Patch> patches_;
     std::optional<BufReorderInfo> reorder_;
     QvWideString name_;
+    bool patchable_;
     AuxInfoCallback callback_;
     void* context_;
     std::shared_ptr<QvIoFailure> failure_;
@@ -81,6 +87,10 @@ void SeekPatch::applyPatches() {
 }
 
 void SeekPatch::done(int abort) {
+    if (!patchable_) {
+        if (!abort && (!patches_.empty() || reorder_)) failure_->note(ESPIPE, "Failed to patch", name_);
+        return;
+    }
     if (!patches_.empty() && !abort) applyPatches();
     patches_.clear();
     if (reorder_) moveBlock(name_, *reorder_, *failure_);
@@ -88,12 +98,13 @@ void SeekPatch::done(int abort) {
 
 }  // namespace
 
-bufstream* seekPatchNew(bufstream* inner, AuxInfoCallback callback, void* context,
+bufstream* seekPatchNew(bufstream* inner, bool patchable, AuxInfoCallback callback, void* context,
                         std::shared_ptr<QvIoFailure> failure) {
     std::array<unsigned short, 2048> name{};
     if (inner->auxinfo(inner, 0, QvAuxId::FILE_NAME_INFO, name.data(), sizeof name)) return nullptr;
     if (!name[0]) return nullptr;
-    return RecordOf<SeekPatch>::make(std::unique_ptr<SeekPatch>(new (std::nothrow) SeekPatch(
-                                         inner, name.data(), callback, context, std::move(failure))),
-                                     BUFSTREAM_WRITER);
+    return RecordOf<SeekPatch>::make(
+        std::unique_ptr<SeekPatch>(new (std::nothrow) SeekPatch(inner, name.data(), patchable, callback,
+                                                                context, std::move(failure))),
+        BUFSTREAM_WRITER);
 }

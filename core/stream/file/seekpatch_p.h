@@ -13,6 +13,7 @@ using AuxInfoCallback = void (*)(void* context, unsigned offset, unsigned id, vo
 // then hears of each item.
 //
 // done(abort) opens the file anew, so it runs after the file's own done(), and writes the patches in their
-// order, none with `abort`, and then makes the block move, even then. Failures are noted in `failure`.
-bufstream* seekPatchNew(bufstream* inner, AuxInfoCallback callback, void* context,
+// order, none with `abort`, and then makes the block move, even then. Failures are noted in `failure`; what
+// is not `patchable`, as a pipe, fails if there is anything to change.
+bufstream* seekPatchNew(bufstream* inner, bool patchable, AuxInfoCallback callback, void* context,
                         std::shared_ptr<QvIoFailure> failure);

@@ -69,9 +69,25 @@ void QvTranscoder::Private::prepareRun() {
 void QvTranscoder::Private::beginRun() {
     ++runNumber;
     times.begin(0);
-    stopRequested = false;
-    running = true;
+    {
+        std::lock_guard guard(lock);
+        stopRequested = stopNext;
+        if (!stopNext) cancel->clear();
+        stopNext = false;
+        running = true;
+    }
     setState(QvTranscoder::transcoding);
+}
+
+void QvTranscoder::Private::askForStop(bool next) {
+    {
+        std::lock_guard guard(lock);
+        if (!synchronous) paused = false;
+        stopRequested = true;
+        if (next && !running) stopNext = true;
+        cancel->request();
+    }
+    changed.notify_all();
 }
 
 void QvTranscoder::Private::endRun(int newState) {
@@ -424,18 +440,15 @@ bool QvTranscoder::startWorker(QvTranscodeRun& run) {
 
 int QvTranscoder::stop() {
     if (getState() == notConnected) return QvStatus::ok;
-    {
-        std::lock_guard guard(p_->lock);
-        if (!p_->synchronous) p_->paused = false;
-        p_->stopRequested = true;
-    }
-    p_->changed.notify_all();
+    p_->askForStop(false);
     // A callback that stops its own run can't wait for its end.
     if (p_->onRunThread()) return QvStatus::ok;
     p_->waitForEnd();
     if (isTranscoding() && !p_->running) p_->setState(connected);  // the worker could not be started
     return QvStatus::ok;
 }
+
+void QvTranscoder::requestStop() { p_->askForStop(true); }
 
 int QvTranscoder::pause() {
     QV_ASSERT_MSG(!p_->synchronous, "Transcoder: must not call pause/unpause() in synchronous mode.");

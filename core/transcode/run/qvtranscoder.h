@@ -56,6 +56,10 @@ class QV_API QvTranscoder {
     // Ends a run and waits until it has ended; from any thread. From a callback it asks for the end alone.
     // Always 0.
     virtual int stop();
+    // Asks for the end and returns at once; from any thread and any callback. Between two runs it is for the
+    // next one. Like stop() it ends a wait for the reader of an output that is a pipe, a socket or a
+    // terminal; such a run counts as stopped, and its output is a part.
+    void requestStop();
     // Holds and resumes an asynchronous run between two steps; asserts in a synchronous one.
     virtual int pause();
     virtual int unpause();

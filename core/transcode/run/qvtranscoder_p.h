@@ -9,6 +9,7 @@
 #include <string>
 #include <vector>
 
+#include "core/arch/qvcancel.h"
 #include "core/engine/threads/qvthreads.h"
 #include "core/transcode/run/qvtranscoder.h"
 #include "core/transcode/task/qvtranscodetask.h"
@@ -49,6 +50,9 @@ struct QvTranscoder::Private {
     std::atomic<bool> stopRequested{false}, firstPassRunning{false};
     std::atomic<bool> synchronous{true};
     std::atomic<bool> inCallback{false};
+    bool stopNext = false;  // asked for between two runs; guarded by `lock`
+    // Ends the waits of the output's streams, which share it.
+    const std::shared_ptr<QvCancel> cancel = std::make_shared<QvCancel>();
     bool checkDiscSpace = false, logProgress = false;
     std::vector<std::unique_ptr<QvMetadataFile>> metadataFiles;
     QvStepTimes times;
@@ -70,6 +74,7 @@ struct QvTranscoder::Private {
     void prepareRun();  // asserts that none is going on, and waits for the end of the worker before
     void beginRun();
     void endRun(int newState);
+    void askForStop(bool next);
     void resume();      // clears `paused` and wakes the worker
     void waitForEnd();  // until no run is going on, and joins the worker
     void joinWorkers();

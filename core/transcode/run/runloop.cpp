@@ -136,8 +136,11 @@ int QvTranscodeRun::finish(int result) {
     const bool ended = endOfVideo_ && result == QvStatus::endOfStream;
     if (ended) result = QvStatus::ok;
     if (p_.closeEncoder) result = closeOutput(result);
+    if (p_.closeEncoder) p_.task->encoder()->setCancel(nullptr);  // what follows is the application's
     const int closed = closeLinks(*p_.task);
     if (result == QvStatus::ok) result = closed;
+    // A write that a stop has ended is no failure.
+    if (p_.cancel->gaveUp()) result = QvStatus::ok;
     p_.metadataFiles.clear();
     int told = ended ? QvStatus::endOfStream : kStopped;
     if (result != QvStatus::ok) {

@@ -191,8 +191,10 @@ void QvTranscodeRun::copyMeta() {
 int QvTranscodeRun::openEncoder() {
     QvEncodePipe& pipe = *p_.task->encoder();
     if (pipe.getState() == 3) return QvStatus::ok;
+    pipe.setCancel(p_.cancel);
     const int result = pipe.open();
     if (result == QvStatus::ok) return result;
+    pipe.setCancel(nullptr);
     closeLinks(*p_.task);
     return pipe.errorCode() ? pipe.errorCode() : result;
 }

@@ -1,5 +1,15 @@
 #include "builtin/muxers/rawmux.h"
 
+#include <fcntl.h>
+#include <poll.h>
+#include <sys/stat.h>
+#include <unistd.h>
+#include <thread>
+
+#include "core/decode/qvdecoder.h"
+#include "core/engine/modules/qvregistry.h"
+#include "core/transcode/run/qvtranscoder.h"
+
 #include "tests/support/checks.h"
 #include "tests/support/output_pipe.h"
 
@@ -135,6 +145,73 @@ TEST_F(RawMuxing, FailureToOpenOneClosesAll) {
     std::filesystem::remove(folder_.file("out#01.wav"));
     EXPECT_EQ(pipe_->open(), 0);
     EXPECT_EQ(pipe_->close(), 0);
+}
+
+// One stream under the very name, which may be a pipe; several would overwrite each other.
+TEST_F(RawMuxing, AnExactName) {
+    pipe_->setParam("muxer/exactName", 1);
+    for (const auto& [videos, audios, splits] : {std::tuple{1, 1, 0}, {2, 0, 0}, {0, 1, 1}, {0, 1, 0}}) {
+        streams(videos, audios);
+        split(0, splits);
+        const bool fits = videos + audios == 1 && !splits;
+        EXPECT_EQ(pipe_->open() == 0, fits) << videos << audios << splits;
+        if (!fits) continue;
+        const std::string sound = writeSound(100, 1);
+        ASSERT_EQ(pipe_->close(), 0);
+        EXPECT_EQ(read("out.x").substr(80), sound);
+        EXPECT_EQ(written(), Texts{"out.x"});
+    }
+}
+
+struct CountingTranscoder : QvTranscoder {
+    ~CountingTranscoder() override { QvTranscoder::stop(); }
+    void cbDone(int result) override { results.push_back(result); }
+    std::vector<int> results;
+};
+
+// stop() ends a run whose output nobody reads, or has not even opened; the next one writes as ever.
+TEST_F(RawMuxing, AStopEndsAWaitForTheReader) {
+    const std::string name = folder_.file("fifo");
+    ASSERT_EQ(mkfifo(name.c_str(), 0600), 0);
+    addVideo(QvFourcc::BGR4, 640, 480);
+    pipe_->setParam("muxer/exactName", 1);
+    pipe_->setFilename(Any(name.c_str()));
+    const std::unique_ptr<QvCodec> made(qv_registry()->newCodec("testgen"));
+    auto* decoder = dynamic_cast<QvDecodePipe*>(made.get());
+    ASSERT_TRUE(decoder);
+    const AnyDict video("width", 640, "height", 480, "framerate", 25.0, "duration", 20000.0);
+    decoder->setParam("streams", AnyDict("vids", AnyVector(Any(video)), "auds", AnyVector()));
+    ASSERT_EQ(decoder->open(), 0);
+    CountingTranscoder t;
+    t.setEncoder(pipe_.get());
+    ASSERT_GE(t.link(decoder, 1, 0, 0), 0) << t.errorDesc();
+    t.setParam("startDelay", 0);
+
+    std::thread stopping([&] {
+        while (!t.isTranscoding()) std::this_thread::yield();
+        t.stop();
+    });
+    EXPECT_LT(t.transcode(false), 0) << "nobody opens the pipe";
+    stopping.join();
+    EXPECT_TRUE(t.results.empty());
+
+    t.requestStop();  // between two runs: for the next one
+    EXPECT_LT(t.transcode(false), 0);
+
+    const int reader = open(name.c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
+    for (const bool wait : {true, false}) {
+        ASSERT_EQ(t.transcode(false), 0) << t.errorDesc();
+        pollfd data{reader, POLLIN, 0};
+        EXPECT_EQ(poll(&data, 1, 60'000), 1);
+        if (!wait) t.requestStop();
+        t.stop();
+        char block[65536];
+        while (::read(reader, block, sizeof block) > 0) {
+        }
+    }
+    EXPECT_EQ(t.results, (std::vector{1, 1})) << "stopped runs, not failed ones";
+    EXPECT_EQ(t.errorCode(), 0);
+    close(reader);
 }
 
 }  // namespace

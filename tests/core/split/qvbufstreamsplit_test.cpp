@@ -1,6 +1,9 @@
 #include "core/split/qvbufstreamsplit.h"
 
+#include <fcntl.h>
 #include <gmock/gmock.h>
+#include <sys/stat.h>
+#include <unistd.h>
 
 #include "core/image/qvimage.h"
 #include "core/media/qvframe.h"
@@ -196,6 +199,48 @@ TEST_F(QvBsSplitAudioTest, AFullDiscStopsTheRing) {
         EXPECT_EQ(stream.ioError(), ENOSPC);
         stream.destroy(1);
     }
+}
+
+// Nobody can go back to the header of a pipe: it states what was expected, or that nothing is known.
+TEST_F(QvBsSplitAudioTest, AStreamGetsItsHeaderAtOnce) {
+    const std::string name = folder.file("take.wav");
+    ASSERT_EQ(mkfifo(name.c_str(), 0600), 0);
+    constexpr uint32_t unknown = 0xFFFFFFFF;
+    const struct {
+        Any expected;
+        uint32_t riff, fact, data;
+    } rows[] = {{Any(100), 472, 200, 400},
+                {Any(100LL), 472, 200, 400},
+                {Any(), unknown, unknown, unknown},
+                {Any(-1), unknown, unknown, unknown},
+                {Any(1LL << 61), unknown, unknown, unknown}};
+    for (const auto& row : rows) {
+        const int reader = ::open(name.c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
+        const AnyDict params("outfilename", name.c_str(), "samplerate", 48000, "channels", 2, "bitsPerSample",
+                             16, "size", 20'000, "chunk", 1001, "expectedSamples", row.expected);
+        ASSERT_EQ(stream.init(params), 0) << stream.ioErrorText();
+        const std::string samples = patternBytes(400);
+        unit(stream, AUDIO_AU_CODE, samples);
+        tell(stream.input(), STREAM_END_CODE);
+        EXPECT_EQ(stream.ioTaken(), 480u);
+        stream.destroy(0);
+        EXPECT_EQ(stream.ioError(), 0) << stream.ioErrorText();
+        std::string got(1000, '?');
+        got.resize(static_cast<size_t>(std::max(read(reader, got.data(), got.size()), ssize_t{0})));
+        close(reader);
+        ASSERT_EQ(got.size(), 480u);
+        EXPECT_EQ(got.substr(80), samples);
+        EXPECT_EQ(leNumber(got, 4, 4), row.riff);
+        EXPECT_EQ(leNumber(got, 68, 4), row.fact);
+        EXPECT_EQ(leNumber(got, 76, 4), row.data);
+    }
+}
+
+TEST_F(QvBsSplitAudioTest, TheNullDeviceIsNotLargerThanAHeaderCanState) {
+    QvIoFailure failure;
+    qv_log()->clear();
+    writeWavHeader(qv_wide_name("/dev/null"), {48'000, 2, 16}, failure);
+    EXPECT_EQ(qv_log()->nrWarnings(), 0);
 }
 
 TEST(WavHeader, SizesBeyondFourGibAreTheLargestAndTold) {

@@ -172,6 +172,21 @@ TEST_F(FileStream, PatchesGoInWhenTheFileIsClosed) {
     EXPECT_EQ(stream.ioError(), EINVAL);
 }
 
+// A pipe has nothing to go back to, so what wants to is a failure and not a file with holes.
+TEST_F(FileStream, AStreamTakesNoPatches) {
+    for (const bool patched : {false, true}) {
+        ASSERT_EQ(stream.init(output("/dev/null")), 0);
+        bufstream* in = stream.input();
+        ASSERT_TRUE(put(in, patternBytes(60)));
+        ASSERT_EQ(copyIn(in, patternBytes(500)), 500u);
+        const BufSeekInfo change{0, "x", 1};
+        if (patched) tell(in, BUF_SEEK_INFO, change);
+        stream.destroy(0);
+        EXPECT_EQ(stream.ioError(), patched ? ESPIPE : 0);
+        EXPECT_EQ(stream.ioTaken(), 560u);
+    }
+}
+
 TEST_F(FileStream, FlushEndsThePatchesWhileTheFileIsOpen) {
     bufstream* in = begin();
     put(in, "0123456789");
