@@ -63,7 +63,10 @@ void addTranscode(CommandLine& line, Signals& signals) {
     auto given = std::make_shared<Given>();
     JobOptions& job = given->job;
     command.arguments("INPUT", job.inputs, "Files, or testgen:size=1280x720,rate=25,duration=10");
-    command.option("-o,--output", job.output, "What to write; the extension says how", "FILE");
+    command.option("-o,--output", job.output,
+                   "What to write; the extension says how. - is the standard output", "FILE");
+    command.option("--format", job.format, "What to write, in the place of an extension: wav, raw, ...",
+                   "EXT");
     command.option("--raw", job.raw, "Format of a raw input: size=WxH,pixel=FORMAT,rate=R", "K=V,...");
     command.option("--from", job.from, "First instant taken: SS.mmm, HH:MM:SS, 120f, HH:MM:SS:FF", "TIME");
     command.option("--to", job.to, "First instant not taken", "TIME");

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cstdio>
 #include <new>
+#include <set>
 
 #include "tarsel/host/files.h"
 #include "tarsel/words/messages.h"
@@ -60,29 +61,47 @@ bool Job::hasVideo() const {
     return std::any_of(streams_.begin(), streams_.end(), [](const auto& s) { return s.type == kVideo; });
 }
 
+bool Job::writesNothing() const { return kind_ == OutputKind::nothing || (stream_ && stream_->discards()); }
+
+bool Job::takesOneStream() const { return stream_ && !stream_->discards(); }
+
+OutputKind Job::chosenKind() const {
+    const bool named = !options_.format.empty();
+    const std::string extension =
+        QvFile::getExt(Any(((named ? "x." + options_.format : options_.output)).c_str()), true).asString();
+    for (const KindRow& row : kKinds)
+        if (extension == row.extension) return row.kind;
+    std::vector<std::string> known;
+    for (const auto& row : kKinds) known.push_back(row.extension);
+    const std::string near = suggestion(extension, known), hint = near.empty() ? near : "." + near;
+    if (named) throw failure(Msg::formatUnknown, {options_.format, hint});
+    if (options_.output == "-") throw failure(Msg::streamNeedsFormat);
+    if (stream_) return OutputKind::byInput;
+    if (extension.empty()) throw failure(Msg::outputFormatMissing, {options_.output});
+    throw failure(Msg::outputFormatUnknown, {options_.output, extension, hint});
+}
+
 void Job::chooseOutput() {
     if (options_.muxer == "nullmux") {
         kind_ = OutputKind::nothing;
         return;
     }
     if (options_.output.empty()) throw Failure(Exit::usage, "no output; give its name with -o FILE");
-    const std::string extension = QvFile::getExt(Any(options_.output.c_str()), true).asString();
-    const auto* row = std::find_if(std::begin(kKinds), std::end(kKinds),
-                                   [&](const KindRow& r) { return extension == r.extension; });
-    const bool device = isDevice(options_.output);
-    if (row == std::end(kKinds) && !device) {
-        std::vector<std::string> known;
-        for (const auto& r : kKinds) known.push_back(r.extension);
-        throw Failure(Exit::usage,
-                      "-o " + inQuotes(options_.output) + ": " +
-                          (extension.empty() ? "it has no extension that says what to write"
-                                             : "no output has the extension " + inQuotes(extension)) +
-                          "." + suggestion(extension, known) + " 'tarsel formats' lists all");
-    }
-    kind_ = row == std::end(kKinds) ? OutputKind::raw : row->kind;
+    stream_ = StreamOutput::find(options_.output, options_.inputs);
+    kind_ = chosenKind();
+    if (takesOneStream()) checkStream();
+    if (stream_) return;
     outputs_ = std::make_unique<Outputs>(options_.output, "-o", options_.inputs, options_.policy);
     if (kind_ == OutputKind::pictures) outputs_->checkNumbered("png");
     if (options_.splitChannels) outputs_->checkNumbered("wav");
+}
+
+void Job::checkStream() const {
+    const char* files = kind_ == OutputKind::avi        ? "an AVI file"
+                        : kind_ == OutputKind::pictures ? "a sequence of PNG files"
+                                                        : nullptr;
+    if (files) throw failure(Msg::streamOfFiles, {stream_->name(), files});
+    if (options_.splitChannels) throw failure(Msg::streamOfChannels, {stream_->name()});
 }
 
 void Job::openInputs() {
@@ -109,7 +128,7 @@ void Job::checkLengths() const {
         const std::string left = std::to_string(now), all = std::to_string(lengths_[i]);
         const Failure shrank = failure(Msg::inputShrank, {name, left, all});
         // What a device or a pipe has got can't be taken back.
-        if (outputs_ && outputs_->isDevice()) throw Failure(shrank);
+        if (takesOneStream()) throw Failure(shrank);
         throw InputShrank(shrank, lineOf(Msg::inputShrankTaken, {name, left, all}));
     }
 }
@@ -130,13 +149,14 @@ void Job::planStreams() {
     for (const auto& source : sources_)
         for (int type : {kVideo, kAudio}) {
             if (type == kVideo && kind_ == OutputKind::wav) continue;
-            if (outputs_ && outputs_->isDevice() && !streams_.empty()) continue;
+            if (takesOneStream() && !streams_.empty()) continue;
             for (int i = 0; i < source->decoder().nrStreams(type); ++i) planStream(*source, type, i);
         }
     if (streams_.empty())
         throw Failure(Exit::input, kind_ == OutputKind::wav
                                        ? "no input has sound for " + inQuotes(options_.output)
                                        : std::string("no input has a picture or sound"));
+    if (kind_ == OutputKind::byInput) kind_ = hasVideo() ? OutputKind::raw : OutputKind::wav;
     checkPicture();
     // As captions, of which raw pictures hold none.
     for (const auto& source : sources_)
@@ -147,7 +167,7 @@ void Job::planStreams() {
 
 void Job::checkPicture() const {
     const bool sound = kind_ == OutputKind::wav || kind_ == OutputKind::nothing;
-    if (!sound && !hasVideo() && !outputs_->isDevice())
+    if (!sound && !hasVideo())
         throw Failure(Exit::input, "no input has a picture for " + inQuotes(options_.output) +
                                        "; sound alone is written as .wav");
 }
@@ -260,25 +280,24 @@ std::string Job::primaryExtension() const {
 void Job::buildPipe() {
     pipe_.reset(QvEncodePipe::create());
     if (!pipe_) throw Failure(Exit::module, "this installation can't write any output");
-    if (kind_ == OutputKind::avi) {
+    if (kind_ == OutputKind::avi && !writesNothing()) {
         if (!qvPresetMgr()->profileAvailable(QvProfile::aviRaw))
             throw Failure(Exit::module, "this installation has no AVI output");
         pipe_->applyPreset(QvProfile::aviRaw, 0);
     }
     pipe_->clearStreams();
-    const char* muxer = kind_ == OutputKind::nothing ? "nullmux"
-                        : kind_ == OutputKind::avi   ? "rawavimux"
-                                                     : "rawmux";
+    const char* muxer = writesNothing() ? "nullmux" : kind_ == OutputKind::avi ? "rawavimux" : "rawmux";
     if (std::string_view(pipe_->getMuxer() ? pipe_->getMuxer()->name() : "") != muxer &&
         pipe_->setMuxer(muxer) != QvStatus::ok)
         throw Failure(Exit::module,
                       std::string("the multiplexer ") + muxer + " can't be used: " + pipe_->errorDesc());
     QvMuxer& m = *pipe_->getMuxer();
-    if (kind_ == OutputKind::pictures) {
+    if (kind_ == OutputKind::pictures && !writesNothing()) {
         m.setParam("splitVideo", 1);
         m.setParam("rawAsPng", 1);
     }
-    if (options_.splitChannels) setChecked(m, "splitAudio", 1, "--split-channels");
+    if (options_.splitChannels && !stream_) setChecked(m, "splitAudio", 1, "--split-channels");
+    if (takesOneStream()) m.setParam("exactName", 1);
     for (JobStream& stream : streams_) addStream(stream);
 }
 
@@ -298,20 +317,29 @@ void Job::addStream(JobStream& stream) {
         setChecked(encoder, "samplerate", stream.samplerate, "--samplerate");
         setChecked(encoder, "channels", stream.channels, "--channels");
         setChecked(encoder, "bitsPerSample", stream.bits, "--bits");
+        // The header of a stream goes ahead of the sound; what may end early promises no length.
+        if (takesOneStream() && !options_.acceptPartial)
+            pipe_->getMuxer()
+                ->stream(kAudio, stream.encStream)
+                ->setParam("expectedSamples", Any(stream.expected));
     }
 }
 
 // Names that exist are refused before any work; what is written beside the output counts as well.
 void Job::checkNames() const {
-    if (!outputs_ || outputs_->isDevice()) return;
+    if (!outputs_) return;
     if (kind_ == OutputKind::pictures || options_.splitChannels ||
         (kind_ != OutputKind::avi && streams_.size() > 1))
         outputs_->expectSet();
     pipe_->setFilename(Any(outputs_->hiddenName(primaryExtension()).c_str()));
     const Any names = pipe_->getMuxer()->QvCodec::getParam("filenames");
     if (!names.isVector()) return;
-    for (int i = 0; i < names.asVector().size(); ++i)
-        outputs_->checkFinal(outputs_->finalName(names.asVector().at(i).asString(), "raw"));
+    std::set<std::string> final;
+    for (int i = 0; i < names.asVector().size(); ++i) {
+        const auto name = outputs_->finalName(names.asVector().at(i).asString(), primaryExtension());
+        outputs_->checkFinal(name);
+        if (!final.insert(name).second) throw failure(Msg::outputTwice, {name});
+    }
 }
 
 // What was asked for has to have something that it works on.

@@ -11,6 +11,7 @@
 
 #include "tarsel/host/outputs.h"
 #include "tarsel/host/signals.h"
+#include "tarsel/host/streamoutput.h"
 #include "tarsel/job/progress.h"
 #include "tarsel/picture/picture.h"
 #include "tarsel/source/source.h"
@@ -19,7 +20,7 @@
 
 struct JobOptions {
     std::vector<std::string> inputs;
-    std::string output, raw, from, to, muxer, post, saveTask;
+    std::string output, format, raw, from, to, muxer, post, saveTask;
     EffectOptions effects;
     std::optional<int> samplerate, channels, bits;
     ProgressMode progress = ProgressMode::automatic;
@@ -36,8 +37,9 @@ class InputShrank : public Failure {
     std::string warning;  // for the attempt that takes what is left
 };
 
-// What an output name stands for.
-enum class OutputKind { raw, wav, pictures, avi, nothing };
+// What an output name stands for. `byInput`: a stream whose name does not say it, which takes raw pictures,
+// or WAV where there is no picture.
+enum class OutputKind { raw, wav, pictures, avi, nothing, byInput };
 
 // One stream from an input to the output, with what it will be.
 struct JobStream {
@@ -77,6 +79,8 @@ class Job {
 
     void openInputs();
     void chooseOutput();
+    OutputKind chosenKind() const;
+    void checkStream() const;
     void planStreams();
     void planStream(Source& source, int type, int number);
     static MediaTime endOf(const JobStream& stream);
@@ -106,19 +110,25 @@ class Job {
     void stopIfSignalled() const;
     void checkResult();
     void checkFiles() const;
+    void checkTaken() const;
+    long long taken() const;  // bytes, by a stream
     void report(const std::vector<std::string>& names) const;
     void runPost(const std::vector<std::string>& names) const;
     void showWarnings() const;
     std::string primaryExtension() const;
     bool hasVideo() const;
+    bool writesNothing() const;
+    bool takesOneStream() const;
+    // The engine's words with the names that the user knows.
 
     JobOptions options_;
     Signals& signals_;
     OutputKind kind_ = OutputKind::raw;
     std::vector<std::unique_ptr<Source>> sources_;
     std::vector<JobStream> streams_;
-    std::unique_ptr<Outputs> outputs_, taskFile_;
+    std::unique_ptr<Outputs> outputs_, taskFile_;  // no `outputs_` where there is a `stream_`
     std::vector<std::unique_ptr<Outputs>> filterFiles_;  // what filters write
+    std::unique_ptr<StreamOutput> stream_;
     std::unique_ptr<QvEncodePipe> pipe_;
     std::vector<std::string> warnings_;
     std::vector<long long> lengths_;  // bytes of the inputs at the start; negative for what is no file

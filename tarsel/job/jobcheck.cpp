@@ -4,6 +4,7 @@
 
 #include "tarsel/host/files.h"
 #include "tarsel/job/job.h"
+#include "tarsel/words/messages.h"
 
 namespace fs = std::filesystem;
 
@@ -49,7 +50,22 @@ void Job::checkResult() {
             throw Failure(Exit::input, line + "; --accept-partial keeps what is there");
         warnings_.push_back(line);
     }
-    if (outputs_ && !outputs_->isDevice()) checkFiles();
+    if (outputs_) checkFiles();
+    if (takesOneStream()) checkTaken();
+}
+
+long long Job::taken() const {
+    const JobStream& s = streams_.front();
+    return static_cast<long long>(pipe_->getMuxer()->stream(s.type, s.encStream)->ioTaken());
+}
+
+// A stream can't be read back; the count of what the system took can be checked.
+void Job::checkTaken() const {
+    constexpr long long wavHeader = 80;
+    const JobStream& s = streams_.front();
+    const long long wanted = s.bytes(s.written) + (s.type == 2 ? wavHeader : 0);
+    if (taken() != wanted)
+        throw failure(Msg::streamShort, {stream_->name(), std::to_string(taken()), std::to_string(wanted)});
 }
 
 void Job::checkFiles() const {
@@ -68,8 +84,8 @@ void Job::checkFiles() const {
             const fs::path file = sound < sounds.size() ? sounds[sound++] : fs::path();
             const long long samples = samplesOf(file);
             if (samples != s.written)
-                differs(file.empty() ? options_.output : outputs_->finalName(file, "raw"), samples, s.written,
-                        "samples");
+                differs(file.empty() ? options_.output : outputs_->finalName(file, primaryExtension()),
+                        samples, s.written, "samples");
         }
     }
     const auto found = static_cast<long long>(ofExtension(files, ".png").size());

@@ -32,7 +32,7 @@ void Job::printPlan() const {
               s.bytes(s.expected));
         total += s.bytes(s.expected);
     }
-    print("output  %s by %s, %s\n", outputs_ ? inQuotes(outputs_->output().string()).c_str() : "nothing",
+    print("output  %s by %s, %s\n", outputs_ || stream_ ? inQuotes(options_.output).c_str() : "nothing",
           pipe_->getMuxer()->name(), formatBytes(total).c_str());
     showWarnings();
 }

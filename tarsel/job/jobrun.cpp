@@ -80,7 +80,7 @@ class Job::Runner : public QvTranscoder {
             stop_ = true;
             changed_.notify_all();
         }
-        if (isPaused()) unpause();
+        QvTranscoder::requestStop();
     }
 
     // Why the run failed: a link knows it better than the log, and that better than the run.
@@ -155,7 +155,7 @@ class Job::Runner : public QvTranscoder {
 };
 
 void Job::checkSpace() const {
-    if (!outputs_ || outputs_->isDevice()) return;
+    if (!outputs_) return;
     const long long space = QvFile::freeSpace(Any(outputs_->hiddenName(primaryExtension()).c_str()));
     long long need = 0;
     if (kind_ != OutputKind::pictures)
@@ -179,6 +179,7 @@ void Job::link(Runner& runner) const {
 
 int Job::runLinked(Runner& runner, Progress& progress) {
     if (outputs_) pipe_->setFilename(Any(outputs_->begin(primaryExtension()).c_str()));
+    if (stream_) pipe_->setFilename(Any(stream_->engineName().c_str()));
     progress.start();
     qv_log()->clear();
     stopIfSignalled();
@@ -229,8 +230,9 @@ void Job::run() {
         takeWarnings();
         checkResult();
         stopIfSignalled();
-        if (outputs_) names = outputs_->commit("raw");
+        if (outputs_) names = outputs_->commit(primaryExtension());
         for (auto& file : filterFiles_) file->commit("");
+        if (stream_) names = {stream_->name()};
     }
     if (options_.post.empty()) signals_.complete();
     // The result is there, whether or not there is memory to say so.
@@ -287,15 +289,15 @@ void Job::discard() {
 }
 
 std::string Job::withFinalNames(std::string text) const {
+    if (stream_) text = stream_->withUserName(text);
     if (outputs_) text = outputs_->withFinalNames(std::move(text));
     for (const auto& file : filterFiles_) text = file->withFinalNames(std::move(text));
     return text;
 }
 
 void Job::stopped(Exit signalled) const {
-    const bool device = outputs_ && outputs_->isDevice();
-    throw Failure(signalled, device ? "stopped; " + inQuotes(options_.output) + " has a part of it"
-                                    : "stopped; nothing was left behind");
+    throw Failure(signalled, takesOneStream() && taken() > 0 ? lineOf(Msg::streamStopped, {stream_->name()})
+                                                             : "stopped; nothing was left behind");
 }
 
 bool Job::failedForMemory(const Runner& runner) const {
@@ -327,15 +329,18 @@ void Job::fail(Runner& runner, int result) const {
         if (reason.empty() && codec && codec->errorCode() != 0) reason = codec->errorDesc();
     };
     for (const JobStream& s : streams_)
-        if (const QvBufStream* file = pipe_->getMuxer()->stream(s.type, s.encStream); file && reason.empty())
+        if (const QvBufStream* file = pipe_->getMuxer()->stream(s.type, s.encStream);
+            file && reason.empty()) {
+            if (stream_ && file->ioError() == EPIPE) throw failure(Msg::streamReaderGone, {stream_->name()});
             reason = file->ioErrorText();
+        }
     for (const JobStream& s : streams_) take(pipe_->encoder(s.type, s.encStream));
     take(pipe_->getMuxer());
     take(pipe_->sink());
     take(pipe_.get());
-    if (!reason.empty() && outputs_)
-        throw Failure(Exit::output, "can't write " + inQuotes(outputs_->output().string()) + ": " +
-                                        inLine(withFinalNames(reason)));
+    if (!reason.empty() && (outputs_ || stream_))
+        throw Failure(Exit::output,
+                      "can't write " + inQuotes(options_.output) + ": " + inLine(withFinalNames(reason)));
     if (runner.filterFailure()) throw *runner.filterFailure();
     reason = runner.reason();
     throw Failure(Exit::failed, inLine(withFinalNames(reason)));
@@ -363,7 +368,10 @@ void Job::runPost(const std::vector<std::string>& names) const {
     const auto stopWith = [&](Exit signalled, Msg why) { throw Failure(signalled, lineOf(why, {first})); };
     if (const Exit signalled = signals_.received(); signalled != Exit::done)
         stopWith(signalled, Msg::stoppedBeforePost);
-    ShellCommand command(postCommand(options_.post, options_.inputs, names));
+    std::string line = postCommand(options_.post, options_.inputs, names);
+    // The standard output has the result, and nothing else goes there.
+    if (stream_ && stream_->isStandardOutput()) line.insert(0, "exec 1>&2\n");
+    ShellCommand command(line);
     int status = 0;
     {
         const Signals::Watch running(

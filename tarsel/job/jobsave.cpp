@@ -11,6 +11,7 @@ void Job::saveTask() {
         if (task.link(&s.source->decoder(), s.type, s.decStream, s.encStream, s.params) < 0)
             throw Failure(Exit::failed, inLine(task.errorDesc()));
     if (outputs_) pipe_->setFilename(Any(outputs_->output().c_str()));
+    if (stream_) pipe_->setFilename(Any(stream_->engineName().c_str()));
     if (!options_.post.empty()) task.setPostprocessCommand(options_.post.c_str());
     AnyDict state;
     task.store(state);

@@ -46,6 +46,19 @@ constexpr Message kMessages[] = {
     {Msg::stoppedInPost,      Exit::failed, "stopped in the command of --post", "it got the signal and has ended", "{file} is complete"},
     {Msg::inputShrank,        Exit::input,  "can't use {file}",  "it became shorter while it was read, {text} of {text} bytes are left", "--accept-partial takes what is there"},
     {Msg::inputShrankTaken,   Exit::input,  "{file} became shorter while it was read", "the job was run again with the {text} of {text} bytes that are left", ""},
+    // outputs that are streams
+    {Msg::streamClosed,        Exit::output, "can't write {file}", "the standard output is closed",      "redirect it to a file or a pipe"},
+    {Msg::streamToTerminal,    Exit::usage,  "can't write {file}", "the standard output is a terminal",  "redirect it to a file or a pipe"},
+    {Msg::streamNeedsFormat,   Exit::usage,  "-o -",               "no extension says what to write",    "name it, with --format wav or --format raw"},
+    {Msg::streamOfFiles,       Exit::usage,  "can't write {file}", "{text} can't be a stream",           "raw pictures and WAV can, with --format raw or --format wav"},
+    {Msg::streamOfChannels,    Exit::usage,  "--split-channels",   "{file} takes one stream",            "give -o the name of a file"},
+    {Msg::streamReaderGone,    Exit::output, "can't write {file}", "the reader has closed the pipe",     "it has a part of the output"},
+    {Msg::streamShort,         Exit::check,  "{file} is not what was asked for", "it took {text} of {text} bytes", "do not use what it has"},
+    {Msg::streamStopped,       Exit::interrupted, "stopped",       "",                                   "{file} has a part of it"},
+    {Msg::formatUnknown,       Exit::usage,  "--format",           "there is no format {name}",          "'tarsel formats' lists all{text}"},
+    {Msg::outputFormatUnknown, Exit::usage,  "-o {file}",          "no output has the extension {name}", "name its format with --format, 'tarsel formats' lists all{text}"},
+    {Msg::outputFormatMissing, Exit::usage,  "-o {file}",          "no extension says what to write",    "name its format with --format, 'tarsel formats' lists all"},
+    {Msg::outputTwice,         Exit::usage,  "can't write {file}", "two files of this job would have this name", "give -o the extension of its format"},
 };
 // clang-format on
 

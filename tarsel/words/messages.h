@@ -47,6 +47,19 @@ enum class Msg : unsigned char {
     stoppedInPost,
     inputShrank,
     inputShrankTaken,
+    // outputs that are streams
+    streamClosed,
+    streamToTerminal,
+    streamNeedsFormat,
+    streamOfFiles,
+    streamOfChannels,
+    streamReaderGone,
+    streamShort,
+    streamStopped,
+    formatUnknown,
+    outputFormatUnknown,
+    outputFormatMissing,
+    outputTwice,
     count,  // of messages, none itself
 };
 

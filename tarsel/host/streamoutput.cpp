@@ -1,0 +1,67 @@
+#include "tarsel/host/streamoutput.h"
+
+#include <filesystem>
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <sys/sysmacros.h>
+#include <unistd.h>
+
+#include "tarsel/words/messages.h"
+
+namespace fs = std::filesystem;
+
+namespace {
+
+constexpr const char* kStandard = "/dev/stdout";
+
+// The shell's redirection makes a file of these, which is written as a stream all the same.
+bool namesDescriptor(const std::string& name) {
+    for (const char* start : {"/dev/stdout", "/dev/stderr", "/dev/fd/", "/proc/self/fd/"})
+        if (name.rfind(start, 0) == 0) return true;
+    return false;
+}
+
+bool isNullDevice(const struct stat& facts) {
+    return S_ISCHR(facts.st_mode) && major(facts.st_rdev) == 1 && minor(facts.st_rdev) == 3;
+}
+
+bool sameFile(const std::string& first, const std::string& second) {
+    std::error_code error;
+    return fs::is_regular_file(second, error) && fs::equivalent(first, second, error);
+}
+
+}  // namespace
+
+std::unique_ptr<StreamOutput> StreamOutput::find(const std::string& output,
+                                                 const std::vector<std::string>& inputs) {
+    StreamOutput found;
+    found.name_ = output;
+    found.standard_ = output == "-" || output == kStandard || output == "/dev/fd/1";
+    struct stat facts {};
+    const std::string name = found.engineName();
+    if (found.standard_) {
+        // One that was closed is opened the wrong way round when the program starts.
+        const int flags = fcntl(STDOUT_FILENO, F_GETFL);
+        if (flags < 0 || (flags & O_ACCMODE) == O_RDONLY || fstat(STDOUT_FILENO, &facts) != 0)
+            throw failure(Msg::streamClosed, {output});
+        if (isatty(STDOUT_FILENO)) throw failure(Msg::streamToTerminal, {output});
+    } else if (stat(name.c_str(), &facts) != 0 || S_ISDIR(facts.st_mode) ||
+               (S_ISREG(facts.st_mode) && !namesDescriptor(name))) {
+        return nullptr;
+    }
+    for (const auto& input : inputs)
+        if (sameFile(input, name)) throw failure(Msg::outputIsInput, {output});
+    found.discards_ = isNullDevice(facts);
+    return std::make_unique<StreamOutput>(found);
+}
+
+std::string StreamOutput::engineName() const { return name_ == "-" ? kStandard : name_; }
+
+std::string StreamOutput::withUserName(std::string text) const {
+    const std::string engine = engineName();
+    if (engine == name_) return text;
+    for (size_t at = 0; (at = text.find(engine, at)) != std::string::npos; at += name_.size())
+        text.replace(at, engine.size(), name_);
+    return text;
+}
