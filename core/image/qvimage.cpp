@@ -66,7 +66,8 @@ int QvImage::saveFrame(const QvFrame& frame, const Any& path, int format) {
     if (!picture) return QvStatus::failed;
 
     const std::string name = fileName(path);
-    File file(qv_platform().openFile(name.c_str(), "wb"));
+    bool isStream = false;
+    File file(qv_platform().openOutput(name.c_str(), nullptr, isStream));
     if (!file) {
         qv_log()->error("[Save image] Can not open %s for writing.", name.c_str());
         return QvStatus::failed;
@@ -75,7 +76,7 @@ int QvImage::saveFrame(const QvFrame& frame, const Any& path, int format) {
     written = std::fclose(file.release()) == 0 && written;
     if (written) return QvStatus::ok;
     qv_log()->error("Can not write file");
-    removePartial(name);
+    if (!isStream) removePartial(name);
     return QvStatus::failed;
 }
 

@@ -7,6 +7,7 @@
 #include "tarsel/commands/outputoptions.h"
 #include "tarsel/host/outputs.h"
 #include "tarsel/host/signals.h"
+#include "tarsel/host/streamoutput.h"
 #include "tarsel/picture/picturereader.h"
 #include "tarsel/source/source.h"
 #include "tarsel/words/commandline.h"
@@ -24,7 +25,8 @@ struct Given {
     std::string input, raw, at, output, sheet;
     EffectOptions effects;
     OutputOptions outputOptions;
-    std::shared_ptr<Outputs> outputs;
+    std::shared_ptr<Outputs> outputs;  // null where there is a `stream`
+    std::shared_ptr<StreamOutput> stream;
     Signals* signals = nullptr;
 };
 
@@ -52,10 +54,13 @@ class Shrinker {
 };
 
 void save(const QvFrame& picture, const Given& given) {
-    Outputs& outputs = *given.outputs;
-    const Signals::Watch watch(
-        *given.signals, {.first = {}, .second = [&] { return outputs.discard(), false; }, .report = {}});
-    const std::string name = outputs.begin("png");
+    Outputs* const outputs = given.outputs.get();
+    const auto leave = [&] {
+        if (outputs) outputs->discard();
+        return outputs && outputs->placed();
+    };
+    const Signals::Watch watch(*given.signals, {.first = {}, .second = leave, .report = {}});
+    const std::string name = outputs ? outputs->begin("png") : given.stream->engineName();
     if (picture.four_cc() != QvFourcc::BGR3) makeAnyCodec("scaler", kVideoFilter);  // says that it is missing
     qv_log()->clear();
     if (QvImage::saveFrame(picture, Any(name.c_str()), 0) != 0) {
@@ -63,9 +68,10 @@ void save(const QvFrame& picture, const Given& given) {
         qv_log()->getAll(messages);
         const std::string reason = messages.empty() ? "" : messages.back().asDict().getString("text", "");
         throw Failure(Exit::output, "can't write " + inQuotes(given.output) + ": " +
-                                        inLine(outputs.withFinalNames(reason)));
+                                        inLine(outputs ? outputs->withFinalNames(reason)
+                                                       : given.stream->withUserName(reason)));
     }
-    outputs.commit("png");
+    if (outputs) outputs->commit("png");
     given.signals->complete();
     std::fprintf(stderr, "tarsel: wrote %s\n", inQuotes(given.output).c_str());
 }
@@ -94,11 +100,13 @@ void saveSheet(PictureReader& reader, const Given& given) {
 void frame(Given& given) {
     given.effects.check();
     const OutputPolicy policy = given.outputOptions.policy();
+    given.stream = StreamOutput::find(given.output, {given.input});
     const Any extension = QvFile::getExt(Any(given.output.c_str()), true);
-    if (!(extension == "png"))
+    if (!given.stream && !(extension == "png"))
         throw Failure(Exit::usage, "-o " + inQuotes(given.output) + ": a picture is a .png file");
     Source source(given.input, given.raw);
-    given.outputs = std::make_shared<Outputs>(given.output, "-o", std::vector{given.input}, policy);
+    if (!given.stream)
+        given.outputs = std::make_shared<Outputs>(given.output, "-o", std::vector{given.input}, policy);
     if (source.decoder().nrStreams(1) == 0)
         throw Failure(Exit::input, inQuotes(given.input) + " has no picture");
     source.selectAll();
@@ -124,7 +132,8 @@ void addFrame(CommandLine& line, Signals& signals) {
     command.option("--at", given->at, "The instant: SS.mmm, HH:MM:SS, 120f, HH:MM:SS:FF", "TIME");
     command.option("--sheet", given->sheet, "A sheet of COLUMNSxROWS pictures", "NxM");
     command.option("--raw", given->raw, "Format of a raw file: size=WxH,pixel=FORMAT,rate=R", "K=V,...");
-    command.option("-o,--output", given->output, "The picture", "FILE.png", Need::required);
+    command.option("-o,--output", given->output, "The picture; - is the standard output", "FILE.png",
+                   Need::required);
     addEffectOptions(command, given->effects);
     given->outputOptions.add(command);
     command.action([given] { frame(*given); });

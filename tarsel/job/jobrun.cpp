@@ -290,6 +290,12 @@ void Job::discard() {
 
 std::string Job::withFinalNames(std::string text) const {
     if (stream_) text = stream_->withUserName(text);
+    // The first file has the user's own extension.
+    const Any file = outputs_ && pipe_ ? pipe_->getFilename() : Any();
+    const std::string hidden = file.isString() ? file.asString() : "";
+    for (size_t at = 0; !hidden.empty() && (at = text.find(hidden, at)) != std::string::npos;
+         at += options_.output.size())
+        text.replace(at, hidden.size(), options_.output);
     if (outputs_) text = outputs_->withFinalNames(std::move(text));
     for (const auto& file : filterFiles_) text = file->withFinalNames(std::move(text));
     return text;

@@ -125,6 +125,23 @@ TEST_F(Streams, AFormatNamesWhatTheExtensionDoesNot) {
     EXPECT_EQ(size("clip.x"), static_cast<long long>(kFrames));
     EXPECT_TRUE(contents("sound") == contents("clip.wav"));
     EXPECT_EQ(contents("movie").substr(8, 4), "AVI ");
+
+    ProcessOptions limited = here();
+    limited.fileLimit = 40000;
+    for (const std::string name : {"new", "new.i420"}) {
+        const std::string format = name == "new" ? "wav" : "raw";
+        const Outcome o = tarsel({"transcode", kCard, "-o", name, "--format", format}, limited);
+        failsAs(4, o, {"write to '" + name + "': File too large"}, "the name that the user wrote");
+    }
+}
+
+TEST_F(Streams, OnePictureIsAStream) {
+    works({"frame", kCard, "-o", "card.png"});
+    for (const std::string name : {"-", "/dev/stdout"})
+        EXPECT_TRUE(works({"frame", kCard, "-o", name}).out == contents("card.png")) << name;
+    works({"frame", kCard, "-o", "/dev/null"});
+    fails(4, {"frame", kCard, "-o", "/dev/full"}, {"'/dev/full'"});
+    EXPECT_TRUE(std::filesystem::exists("/dev/full"));
 }
 
 TEST_F(Streams, TheNullDeviceTakesAnything) {
