@@ -302,8 +302,9 @@ std::string Job::withFinalNames(std::string text) const {
 }
 
 void Job::stopped(Exit signalled) const {
-    throw Failure(signalled, takesOneStream() && taken() > 0 ? lineOf(Msg::streamStopped, {stream_->name()})
-                                                             : "stopped; nothing was left behind");
+    const bool part = takesOneStream() && taken() > 0;
+    throw Failure(signalled, part ? "stopped; " + inQuotes(options_.output) + " has a part of it"
+                                  : "stopped; nothing was left behind");
 }
 
 bool Job::failedForMemory(const Runner& runner) const {

@@ -54,7 +54,6 @@ constexpr Message kMessages[] = {
     {Msg::streamOfChannels,    Exit::usage,  "--split-channels",   "{file} takes one stream",            "give -o the name of a file"},
     {Msg::streamReaderGone,    Exit::output, "can't write {file}", "the reader has closed the pipe",     "it has a part of the output"},
     {Msg::streamShort,         Exit::check,  "{file} is not what was asked for", "it took {text} of {text} bytes", "do not use what it has"},
-    {Msg::streamStopped,       Exit::interrupted, "stopped",       "",                                   "{file} has a part of it"},
     {Msg::formatUnknown,       Exit::usage,  "--format",           "there is no format {name}",          "'tarsel formats' lists all{text}"},
     {Msg::outputFormatUnknown, Exit::usage,  "-o {file}",          "no output has the extension {name}", "name its format with --format, 'tarsel formats' lists all{text}"},
     {Msg::outputFormatMissing, Exit::usage,  "-o {file}",          "no extension says what to write",    "name its format with --format, 'tarsel formats' lists all"},

@@ -55,7 +55,6 @@ enum class Msg : unsigned char {
     streamOfChannels,
     streamReaderGone,
     streamShort,
-    streamStopped,
     formatUnknown,
     outputFormatUnknown,
     outputFormatMissing,
