@@ -46,7 +46,8 @@ TEST_F(Streams, WavIsAStreamWithTheSizesOfAFile) {
     }
     const Outcome o = works({"transcode", "in.wav", "-o", "-", "--format", "WAV", "--accept-partial"});
     EXPECT_EQ(o.out.substr(80), file.substr(80));
-    for (const size_t at : {4u, 68u, 76u}) EXPECT_EQ(field(o.out, at), 0xFFFFFFFFu) << "no length is promised";
+    for (const size_t at : {4u, 68u, 76u})
+        EXPECT_EQ(field(o.out, at), 0xFFFFFFFFu) << "no length is promised";
     folder.write("unknown.wav", o.out);
     works({"transcode", "unknown.wav", "-o", "again.wav"});
     EXPECT_TRUE(contents("again.wav") == file);
