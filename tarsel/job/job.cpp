@@ -400,7 +400,7 @@ void Job::takeWarnings() {
     qv_log()->getAll(messages);
     for (int i = 0; i < messages.size(); ++i) {
         const AnyDict& message = messages.at(i).asDict();
-        const std::string text = inLine(withUserNames(message.getString("text", "")));
+        const std::string text = inLine(withFinalNames(message.getString("text", "")));
         if (message.getInt32("type", 0) == warning &&
             std::find(warnings_.begin(), warnings_.end(), text) == warnings_.end())
             warnings_.push_back(text);

@@ -126,7 +126,7 @@ class Job {
     OutputKind kind_ = OutputKind::raw;
     std::vector<std::unique_ptr<Source>> sources_;
     std::vector<JobStream> streams_;
-    std::unique_ptr<Outputs> outputs_, taskFile_;  // no `outputs_` where there is a `stream_`
+    std::unique_ptr<Outputs> outputs_, taskFile_;        // no `outputs_` where there is a `stream_`
     std::vector<std::unique_ptr<Outputs>> filterFiles_;  // what filters write
     std::unique_ptr<StreamOutput> stream_;
     std::unique_ptr<QvEncodePipe> pipe_;
