@@ -5,7 +5,18 @@
 
 #include "core/arch/api.h"
 
-// Base of the family. Holds a copy of its text, cut to 1,023 characters. If there is no memory for the copy
+// Base of the family, which is not derived from std::exception: a `catch (const std::exception&)` lets it
+// pass. Callers of the engine catch both:
+//
+//     try {
+//         task.restore(state, decoders, &pipe);
+//     } catch (const QvException& failure) {   // the engine's own; std::bad_alloc is not one of them
+//         fprintf(stderr, "%s\n", failure.what());
+//     } catch (const std::exception& failure) {
+//         fprintf(stderr, "%s\n", failure.what());
+//     }
+//
+// Holds a copy of its text, cut to 1,023 characters. If there is no memory for the copy
 // the object stays without a text and what() gives "Tarsel exception".
 class QV_API QvException {
   public:

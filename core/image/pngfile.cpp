@@ -171,7 +171,7 @@ int qvReadPng(std::FILE* file, const char* name, QvFrame& picture, QvFrame* alph
     ImageHead head;
     if (!reader.info || !readHeadJumping(reader.png, reader.info, file, bytesOf(file), &head)) {
         qv_log()->warning("Can not read %s: %s", name, reader.message.text);
-        return QvStatus::ok;
+        return QvStatus::cannotParse;
     }
     QvFrame* alphaFrame = head.alpha ? alpha : nullptr;
     if (!prepare(head, picture, alphaFrame)) {
@@ -179,10 +179,10 @@ int qvReadPng(std::FILE* file, const char* name, QvFrame& picture, QvFrame* alph
         return QvStatus::failed;
     }
     auto rows = rowPointers(picture, head.height);
-    if (!readRowsJumping(reader.png, reader.info, rows.data()))
-        qv_log()->warning("%s is damaged: %s", name, reader.message.text);
+    const bool whole = readRowsJumping(reader.png, reader.info, rows.data());
+    if (!whole) qv_log()->warning("%s is damaged: %s", name, reader.message.text);
     splitAlpha(head, picture, alphaFrame);
-    return QvStatus::ok;
+    return whole ? QvStatus::ok : QvStatus::cannotParse;
 }
 
 bool qvWritePng(const QvFrame& frame, std::FILE* file) {

@@ -1,5 +1,6 @@
 #include "core/image/qvimage.h"
 
+#include <cerrno>
 #include <cstdio>
 #include <memory>
 #include <string>
@@ -12,6 +13,7 @@
 #include "core/filter/qvfilter.h"
 #include "core/image/bmpfile_p.h"
 #include "core/image/pngfile_p.h"
+#include "core/image/wholepicture_p.h"
 #include "core/media/qvframe.h"
 #include "core/value/any.h"
 
@@ -63,24 +65,34 @@ int QvImage::saveFrame(const QvFrame& frame, const Any& path, int format) {
     QV_ASSERT(format != bmp || frame.four_cc() == QvFourcc::BGR3);
     std::unique_ptr<QvCodec> scaler;
     const QvFrame* picture = frame.four_cc() == QvFourcc::BGR3 ? &frame : asBgr3(frame, scaler);
-    if (!picture) return QvStatus::failed;
-
+    if (!picture) {
+        errno = 0;
+        return QvStatus::failed;
+    }
     const std::string name = fileName(path);
     bool isStream = false;
     File file(qv_platform().openOutput(name.c_str(), nullptr, isStream));
     if (!file) {
+        const int reason = errno;
         qv_log()->error("[Save image] Can not open %s for writing.", name.c_str());
+        errno = reason;
         return QvStatus::failed;
     }
+    errno = 0;
     bool written = format == bmp ? qvWriteBmp(*picture, file.get()) : qvWritePng(*picture, file.get());
-    written = std::fclose(file.release()) == 0 && written;
+    int reason = errno;
+    if (std::fclose(file.release()) != 0) {
+        if (written) reason = errno;
+        written = false;
+    }
     if (written) return QvStatus::ok;
     qv_log()->error("Can not write file");
     if (!isStream) removePartial(name);
+    errno = reason;
     return QvStatus::failed;
 }
 
-int QvImage::loadFrame(QvFrame& picture, const Any& path, QvFrame* alpha, unsigned) {
+int qvLoadWhole(QvFrame& picture, const Any& path, QvFrame* alpha) {
     const std::string name = fileName(path);
     const File file(qv_platform().openFile(name.c_str(), "rb"));
     if (!file) {
@@ -89,4 +101,9 @@ int QvImage::loadFrame(QvFrame& picture, const Any& path, QvFrame* alpha, unsign
     }
     if (!qvIsPng(file.get())) return QvStatus::failed;
     return qvReadPng(file.get(), name.c_str(), picture, alpha);
+}
+
+int QvImage::loadFrame(QvFrame& picture, const Any& path, QvFrame* alpha, unsigned) {
+    const int result = qvLoadWhole(picture, path, alpha);
+    return result == QvStatus::cannotParse ? QvStatus::ok : result;
 }

@@ -1,4 +1,5 @@
 #include <algorithm>
+#include <cerrno>
 #include <cstdio>
 #include <cstring>
 #include <mutex>
@@ -178,7 +179,7 @@ bool QvBsSplitVideo::savePicture(const QvFrame& frame, const Any& name) {
     const QvFrame& picture = converter_ ? *converted_ : frame;
     if (converter_ && converter_->convert(frame, *converted_) != QvStatus::ok) return false;
     if (QvImage::saveFrame(picture, name, QvImage::png) == QvStatus::ok) return true;
-    failure()->note(0, "Failed to write to", qv_wide_name(qv_os_name(name)));
+    failure()->note(errno, "Failed to write to", qv_wide_name(qv_os_name(name)));
     return false;
 }
 

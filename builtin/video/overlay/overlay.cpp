@@ -1,5 +1,6 @@
 #include "builtin/video/overlay/overlay.h"
 
+#include "core/caption/text/qvtext.h"
 #include "core/caption/text/qvtextrenderingoptions.h"
 #include "core/engine/files/qvfileutil.h"
 #include "core/engine/log/qvlog.h"
@@ -7,7 +8,7 @@
 namespace {
 
 void warnOf(const Any& font) {
-    if (font.isText() && QvFile::isFile(font)) return;
+    if (font.isText() && QvFile::isFile(font) && QvText::isFont(font)) return;
     const Any name = font.toString();
     if (font.isTrue())
         qv_log()->warning("The font %s can't be read: text in it is not drawn", name.asString(""));

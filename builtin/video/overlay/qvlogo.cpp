@@ -5,7 +5,7 @@
 
 #include "builtin/creators.h"
 #include "core/arch/platform.h"
-#include "core/image/qvimage.h"
+#include "core/image/wholepicture_p.h"
 #include "core/measure/qvgeometry.h"
 
 namespace {
@@ -94,7 +94,10 @@ int QvLogo::open() {
     if (settings_.filename.empty()) return setError(QvStatus::failed, "'filename' names no logo picture");
     if (!fileOf(name)) return setError(QvStatus::failed, "The logo picture %s can't be opened", name);
     QvFrame colour, alpha;
-    if (QvImage::loadFrame(colour, Any(name), &alpha) != QvStatus::ok || !colour.inited())
+    const int loaded = qvLoadWhole(colour, Any(name), &alpha);
+    if (loaded == QvStatus::cannotParse)
+        return setError(QvStatus::failed, "The logo picture %s is damaged", name);
+    if (loaded != QvStatus::ok)
         return setError(QvStatus::failed, "The logo picture %s can't be read as a PNG", name);
     const Size size = sizeInFile(name, colour);
     const QvRect part = visiblePart(alpha, size);

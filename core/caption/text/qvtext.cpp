@@ -6,6 +6,7 @@
 #include <span>
 
 #include "core/arch/platform.h"
+#include "core/caption/text/fontface_p.h"
 #include "core/engine/facts/codepages.h"
 #include "core/engine/files/qvfileutil.h"
 #include "core/engine/status.h"
@@ -152,6 +153,14 @@ Any QvText::encodingName(int identifier) {
     for (const Any& encoding : all)
         if (encoding.asDict().getInt32("identifier", -1) == identifier) return encoding.asDict()["name"];
     return "N/A";
+}
+
+bool QvText::isFont(const Any& file) {
+    constexpr int anySize = 32;
+    FontLibrary library;
+    FontFace face;
+    if (library.get()) face.load(library, file, anySize);
+    return face.usable();
 }
 
 Any QvText::cliEscape(const Any& text) { return QvFile::shellQuote(text); }

@@ -48,6 +48,9 @@ class QV_API QvText {
     static void availableEncodings(AnyVector& out);
     static Any encodingName(int identifier);  // "N/A" if this system has none of that number
 
+    // Whether text can be drawn with a file: one that the font library reads.
+    static bool isFont(const Any& file);
+
     // `text` as one word of a command line, in which no character can act. Invalid if it is no text.
     static Any cliEscape(const Any& text);
 };

@@ -153,9 +153,11 @@ TEST_F(Logos, FramesThatChangeAndPicturesThatDoNotFit) {
 
 TEST_F(Logos, FilesThatAreNoLogo) {
     const std::string bytes = TempFolder::read(png_);
-    for (const std::string& name : {std::string(), folder_.file("none.png"), folder_.write("a.png", "PNG?"),
-                                    folder_.write("b.png", bytes.substr(0, 20)), folder_.path().string(),
-                                    folder_.write("x.srt", "1\n00:00:00,000 --> 00:00:01,000\nHi\n")}) {
+    for (const std::string& name :
+         {std::string(), folder_.file("none.png"), folder_.write("a.png", "PNG?"),
+          folder_.write("b.png", bytes.substr(0, 20)),
+          folder_.write("half.png", bytes.substr(0, bytes.size() - 20)), folder_.path().string(),
+          folder_.write("x.srt", "1\n00:00:00,000 --> 00:00:01,000\nHi\n")}) {
         QvLogo logo;
         logo.init();
         logo.setParam("filename", name.c_str());
