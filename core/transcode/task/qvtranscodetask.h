@@ -105,6 +105,11 @@ class QV_API QvTask {
 
     // Writes the task as the dictionary of class "TranscodeTask" that restore reads.
     void store(AnyDict& dict, int options = 0) const;
+    // These three assert (QvAssertFailure) what no stored task can hold, such as another class or a source
+    // that no input file has. They are for states that the application vouches for: a file of any other
+    // origin goes through QvTaskFile (qvtaskfile.h), which reports each fault as a status with its place and
+    // never throws.
+    //
     // Makes running objects of a stored task. The opened decoders join `decoders`, the pipe goes to
     // *encoderOut; both then belong to the caller. After a failure there is no pipe; decoders that were
     // opened by then are in the list.

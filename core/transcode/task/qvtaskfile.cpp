@@ -1,0 +1,297 @@
+#include "core/transcode/task/qvtaskfile.h"
+
+#include <algorithm>
+#include <charconv>
+#include <cstdlib>
+#include <memory>
+#include <new>
+#include <string_view>
+#include <vector>
+
+#include "core/arch/qvexception.h"
+#include "core/document/xmldom.h"
+#include "core/document/xmlline_p.h"
+#include "core/encode/qvencodepipe.h"
+#include "core/engine/status.h"
+#include "core/transcode/task/qvtranscodetask.h"
+
+namespace {
+
+using Text = std::string_view;
+
+constexpr const char* rootName = "TranscodeTask";
+
+// An element with the way to it.
+struct Place {
+    const XmlNode* node = nullptr;
+    std::string path;
+    std::vector<int> children;  // numbers of elements from the root, as qvXmlLine takes them
+
+    Text name() const { return node->name() ? node->name() : ""; }
+    Place child(int index, const std::string& step) const {
+        Place place{node->child(index), path.empty() ? step : path + "/" + step, children};
+        place.children.push_back(index);
+        return place;
+    }
+    // The value of a key, or a place without a node.
+    Place entry(Text key) const {
+        for (int i = 0; i + 1 < node->nrChildren(); i += 2)
+            if (key == node->child(i)->data()) return child(i + 1, std::string(key));
+        return {nullptr, path, children};
+    }
+    explicit operator bool() const { return node != nullptr; }
+};
+
+struct Fault {
+    Place place;
+    int status;
+    std::string reason;
+};
+
+[[noreturn]] void damaged(const Place& place, const std::string& reason) {
+    throw Fault{place, QvStatus::invalidStructure, reason};
+}
+
+bool isWhole(Text text) {
+    while (!text.empty() && Text(" \t\r\n").find(text.front()) != Text::npos) text.remove_prefix(1);
+    while (!text.empty() && Text(" \t\r\n").find(text.back()) != Text::npos) text.remove_suffix(1);
+    long long value = 0;
+    const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), value);
+    return error == std::errc() && end == text.data() + text.size();
+}
+
+bool isDecimal(Text text) {
+    double value = 0;
+    const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), value);
+    return error == std::errc() && end == text.data() + text.size();
+}
+
+std::string attribute(const XmlNode& node, const char* name) {
+    const Any text = node.getAttr(name).toString();
+    return text.asString("");
+}
+
+// --- The values.
+
+struct Numbers {
+    Text element;
+    const char* attributes[4];
+};
+
+// Elements whose attributes are numbers that must be there.
+constexpr Numbers numbersOf[] = {
+    {"framerate", {"num", "denom"}},
+    {"pt", {"x", "y"}},
+    {"rect", {"top", "bottom", "left", "right"}},
+    {"pair", {"first", "second"}},
+    {"mediatime", {"ticks", "scale"}},
+    {"bitrate", {"target"}},
+};
+
+bool isDictionary(const Place& place) {
+    for (const Text plain : {"inv", "i32", "i64", "fl", "str", "wstr", "gen", "vec"})
+        if (place.name() == plain) return false;
+    for (const Numbers& row : numbersOf)
+        if (place.name() == row.element) return false;
+    return true;
+}
+
+void checkValue(const Place& place);
+
+void checkDictionary(const Place& place) {
+    const XmlNode& node = *place.node;
+    for (int i = 0; i < node.nrChildren(); i += 2) {
+        const XmlNode& key = *node.child(i);
+        if (Text(key.name() ? key.name() : "") != "key")
+            damaged(place.child(i, std::to_string(i + 1)), "a key is missing before this value");
+        const std::string name = key.data();
+        if (name.empty()) damaged(place.child(i, std::to_string(i + 1)), "the key is empty");
+        if (i + 1 == node.nrChildren()) damaged(place.child(i, name), "the key has no value");
+        checkValue(place.child(i + 1, name));
+    }
+}
+
+void checkValue(const Place& place) {
+    const Text name = place.name(), data = place.node->data();
+    if ((name == "i32" || name == "i64") && !isWhole(data)) damaged(place, "it is no whole number");
+    if (name == "fl" && !isDecimal(data)) damaged(place, "it is no number");
+    if (name == "key") damaged(place, "the key before it has no value");
+    for (const Numbers& row : numbersOf)
+        if (name == row.element)
+            for (const char* one : row.attributes)
+                if (one && !isWhole(attribute(*place.node, one)))
+                    damaged(place, std::string("its '") + one + "' is no whole number");
+    if (name == "vec")
+        for (int i = 0; i < place.node->nrChildren(); ++i) checkValue(place.child(i, std::to_string(i + 1)));
+    if (isDictionary(place)) checkDictionary(place);
+}
+
+// --- What a task holds.
+
+Place dictionary(const Place& parent, Text key) {
+    const Place found = parent.entry(key);
+    if (!found) damaged(parent, "'" + std::string(key) + "' is missing");
+    if (!isDictionary(found) || found.node->nrChildren() == 0) damaged(found, "it holds no settings");
+    return found;
+}
+
+Place list(const Place& parent, Text key, const char* what) {
+    const Place found = parent.entry(key);
+    if (!found) damaged(parent, "'" + std::string(key) + "' is missing");
+    if (found.name() != "vec" || found.node->nrChildren() == 0)
+        damaged(found, std::string("it holds no ") + what);
+    for (int i = 0; i < found.node->nrChildren(); ++i)
+        if (const Place row = found.child(i, std::to_string(i + 1)); !isDictionary(row))
+            damaged(row, std::string("this is no ") + what);
+    return found;
+}
+
+std::string text(const Place& parent, Text key) {
+    const Place found = parent.entry(key);
+    if (!found) damaged(parent, "'" + std::string(key) + "' is missing");
+    if (found.name() != "str" && found.name() != "wstr") damaged(found, "it is no text");
+    return found.node->data();
+}
+
+int streamType(const Place& stream) {
+    const Place found = stream.entry("type");
+    if (!found) damaged(stream, "'type' is missing");
+    const Text data = found.name() == "i32" ? found.node->data() : "";
+    if (data == "1" || data == "2" || data == "4") return data[0] - '0';
+    damaged(found, "it is no type of stream: 1 is video, 2 audio, 4 subpicture");
+}
+
+void checkSource(const Place& source, int type, const std::vector<std::string>& files) {
+    const std::string file = text(source, "file");
+    if (std::find(files.begin(), files.end(), file) == files.end())
+        damaged(source.entry("file"), "no entry of 'files' has this name");
+    const Place stream = source.entry("stream");
+    if (!stream || stream.name() != "pair")
+        damaged(stream ? stream : source, "there is no pair of stream numbers");
+    if (attribute(*stream.node, "first") != std::to_string(type))
+        damaged(stream, "its type is not that of the output's stream");
+    if (attribute(*stream.node, "second")[0] == '-') damaged(stream, "its number is negative");
+}
+
+void checkStreams(const Place& root, const std::vector<std::string>& files) {
+    const Place made = list(dictionary(root, "encoder"), "streams", "output stream");
+    const Place streams = list(root, "streams", "output stream");
+    for (int i = 0; i < std::min(made.node->nrChildren(), streams.node->nrChildren()); ++i) {
+        const std::string number = std::to_string(i + 1);
+        const Place stream = streams.child(i, number);
+        if (stream.node->nrChildren() == 0) continue;  // without a source
+        const int type = streamType(stream);
+        if (type != streamType(made.child(i, number)))
+            damaged(stream, "the encoder's stream has another type");
+        if (!stream.entry("sources")) continue;
+        const Place sources = list(stream, "sources", "source");
+        for (int k = 0; k < sources.node->nrChildren(); ++k)
+            checkSource(sources.child(k, std::to_string(k + 1)), type, files);
+    }
+}
+
+void checkTask(const Place& root) {
+    if (root.name() != rootName)
+        damaged(root, "this is no task: its outermost element is '" + std::string(root.name()) + "'");
+    if (attribute(*root.node, "version").empty()) damaged(root, "its version is missing");
+    checkDictionary(root);
+    std::vector<std::string> names;
+    const Place files = list(root, "files", "input file");
+    for (int i = 0; i < files.node->nrChildren(); ++i)
+        names.push_back(text(files.child(i, std::to_string(i + 1)), "filename"));
+    checkStreams(root, names);
+}
+
+// --- The file.
+
+QvTaskFault faultOf(const Any& file, const Fault& fault) {
+    return {fault.status, fault.place.path, qvXmlLine(file, fault.place.children), fault.reason};
+}
+
+// "Error in xml file NAME REASON at line N".
+QvTaskFault syntaxFault(const Any& file, const std::string& text) {
+    const Any name = file.toString();
+    const std::string before = std::string("Error in xml file ") + name.asString("") + " ",
+                      mark = " at line ";
+    const std::size_t line = text.rfind(mark);
+    if (text.rfind(before, 0) != 0 || line == std::string::npos)
+        return {QvStatus::cannotParse, "", 0, "it can't be opened"};
+    return {QvStatus::cannotParse, "", std::atoi(text.c_str() + line + mark.size()),
+            text.substr(before.size(), line - before.size())};
+}
+
+// Makes the output once, for what only its modules know.
+void tryEncoder(const Place& root, const AnyDict& state) {
+    const std::unique_ptr<QvEncodePipe> pipe(QvEncodePipe::create());
+    if (!pipe) throw Fault{root.entry("encoder"), QvStatus::failed, "the module 'encpipe' is missing"};
+    const char* const reason = "the output can't be made from these settings";
+    try {
+        if (pipe->restore(state.getDict("encoder")) == QvStatus::ok) return;
+    } catch (const QvException&) {
+    }
+    throw Fault{root.entry("encoder"), QvStatus::failed, reason};
+}
+
+QvTaskFault checked(const Any& file, AnyDict& state) {
+    if (!file.isText()) return {QvStatus::cannotParse, "", 0, "it has no name"};
+    XmlParser parser;
+    try {
+        parser.parseFile(file);
+    } catch (const QvFileException& failure) {
+        return syntaxFault(file, failure.what());
+    }
+    try {
+        const Place root{parser.topLevel(), "", {}};
+        checkTask(root);
+        Any name, version;
+        if (XmlParser::restoreDict(file, state, name, version) != QvStatus::ok)
+            throw Fault{root, QvStatus::cannotParse, "the file has changed meanwhile"};
+        tryEncoder(root, state);
+    } catch (const Fault& fault) {
+        return faultOf(file, fault);
+    }
+    return {};
+}
+
+// `action` with its exceptions as faults.
+template <class Action>
+QvTaskFault guarded(Action action) noexcept {
+    try {
+        return action();
+    } catch (const std::bad_alloc&) {
+        return {QvStatus::outOfMemory, "", 0, "out of memory"};
+    } catch (...) {
+        return {QvStatus::failed, "", 0, "the engine refuses it"};
+    }
+}
+
+}  // namespace
+
+QvTaskFault QvTaskFile::check(const Any& file) noexcept {
+    return guarded([&] {
+        AnyDict state;
+        return checked(file, state);
+    });
+}
+
+QvTask* QvTaskFile::open(const Any& file, QvDPipeList& decoders, QvEncodePipe** encoder,
+                         QvFileOpenCb* callback, QvTaskFault* fault) noexcept {
+    QvTask* task = nullptr;
+    QvDPipeList opened;
+    QvTaskFault found = guarded([&]() -> QvTaskFault {
+        AnyDict state;
+        if (QvTaskFault first = checked(file, state); first.status != QvStatus::ok) return first;
+        Any error;
+        try {
+            task = QvTask::fromState(state, opened, encoder, 0, callback, &error);
+        } catch (const QvException&) {
+            error = "an input can't be opened, or lacks a stream";
+        }
+        if (!task) return {QvStatus::failed, "files", 0, error.asString("")};
+        for (int i = 0; i < opened.size(); ++i) decoders.append(opened.at(i));
+        return {};
+    });
+    if (found.status != QvStatus::ok && !task) opened.deleteAll();
+    if (fault) *fault = std::move(found);
+    return task;
+}

@@ -1,0 +1,42 @@
+// Task files of any origin: whether one is sound, and if not, what is wrong at which place.
+//
+//     const QvTaskFault fault = QvTaskFile::check("job.xml");
+//     if (fault.status != 0)
+//         printf("job.xml, line %d: %s: %s\n", fault.line, fault.path.c_str(), fault.reason.c_str());
+//
+// Nothing here throws. QvTask::restore and fromState take a dictionary that the application vouches for, and
+// assert (QvAssertFailure) what no stored task can hold; a file from elsewhere is checked first, or opened by
+// QvTaskFile::open.
+#pragma once
+
+#include <string>
+
+#include "core/arch/api.h"
+#include "core/decode/qvdpipelist.h"
+#include "core/value/any.h"
+
+class QvEncodePipe;
+struct QvFileOpenCb;
+class QvTask;
+
+struct QvTaskFault {
+    // 0 for a sound file. QvStatus::cannotParse: it can't be opened, or is no XML. invalidStructure: it is no
+    // task, or a part is missing or damaged. failed: its output or its inputs can't be made here, as for want
+    // of a module. outOfMemory.
+    int status = 0;
+    std::string path;    // the keys that lead to the element, numbers (from 1) in vectors: "streams/2/type"
+    int line = 0;        // of the file, from 1; 0 if unknown
+    std::string reason;  // a sentence without its dot; it begins with a small letter
+};
+
+class QV_API QvTaskFile {
+  public:
+    // The document, its values and what a task must hold; then the output is made once, which opens no file.
+    // Inputs are not opened.
+    static QvTaskFault check(const Any& file) noexcept;
+
+    // Checks a file and restores its task, as QvTask::fromState does: the caller owns the task, the pipe and
+    // the decoders. After a fault the result is null, nothing was made, and `fault`, if given, tells.
+    static QvTask* open(const Any& file, QvDPipeList& decoders, QvEncodePipe** encoder,
+                        QvFileOpenCb* callback = nullptr, QvTaskFault* fault = nullptr) noexcept;
+};
