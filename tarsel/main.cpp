@@ -4,18 +4,20 @@
 #include <cstdlib>
 #include <exception>
 #include <new>
+#include <system_error>
 
 #include <qvplugcore/qvplugcore.h>
 
 #include "tarsel/commands/commands.h"
 #include "tarsel/host/console.h"
+#include "tarsel/host/files.h"
 #include "tarsel/host/memory.h"
 #include "tarsel/host/outputs.h"
 #include "tarsel/host/plugins.h"
 #include "tarsel/host/signals.h"
 #include "tarsel/host/terminal.h"
 #include "tarsel/words/commandline.h"
-#include "tarsel/words/failure.h"
+#include "tarsel/words/messages.h"
 
 namespace {
 
@@ -24,6 +26,7 @@ class Engine {
   public:
     Engine(const std::string& log, const std::string& plugins, bool allowUnsafe) {
         AnyDict config;
+        if (!log.empty() && log != "stderr") requireLog(log);
         if (!log.empty()) config.set("logfile", log.c_str());
         if (allowUnsafe) config.set("allow_unsafe_plugins", 1);
         init_wrapper(&config);
@@ -108,15 +111,15 @@ int main(int argc, char** argv) {
     } catch (const Failure& failure) {
         return say(failure.exit(), failure.what());
     } catch (const QvMemoryFailure&) {
-        return say(Exit::failed, "out of memory");
-    } catch (const QvAssertFailure&) {
-        return say(Exit::failed,
-                   memory.ranOut() ? "out of memory" : "an internal error; --log FILE shows where");
-    } catch (const QvException& failure) {
-        return say(Exit::failed, inLine(failure.what()));
+        return say(Exit::failed, lineOf(Msg::outOfMemory));
+    } catch (const QvException&) {
+        return say(Exit::failed, lineOf(memory.ranOut() ? Msg::outOfMemory : Msg::engineFailed));
     } catch (const std::bad_alloc&) {
-        return say(Exit::failed, "out of memory");
-    } catch (const std::exception& failure) {
-        return say(Exit::failed, inLine(failure.what()));
+        return say(Exit::failed, lineOf(Msg::outOfMemory));
+    } catch (const std::system_error& failed) {
+        const Failure failure = failureOf(failed);
+        return say(failure.exit(), failure.what());
+    } catch (const std::exception&) {
+        return say(Exit::failed, lineOf(Msg::engineFailed));
     }
 }

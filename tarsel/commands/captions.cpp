@@ -7,10 +7,12 @@
 
 #include "tarsel/commands/commands.h"
 #include "tarsel/host/console.h"
+#include "tarsel/host/files.h"
+#include "tarsel/source/captionfile.h"
 #include "tarsel/source/source.h"
 #include "tarsel/words/commandline.h"
-#include "tarsel/words/failure.h"
 #include "tarsel/words/json.h"
+#include "tarsel/words/messages.h"
 
 namespace {
 
@@ -65,14 +67,12 @@ std::unique_ptr<QvDecodePipe> openFiles(const std::vector<std::string>& files) {
     decoder->setParam("dropFrameLines", 1);
     AnyVector names;
     for (const auto& file : files) {
-        if (!QvFile::isFile(Any(file.c_str())))
-            throw Failure(Exit::input, "can't open " + inQuotes(file) + ": no such file");
+        requireInput(file);
         names.append(Any(file.c_str()));
     }
     decoder->setParam("filenames", names);
     if (decoder->open() == QvStatus::ok) return decoder;
-    throw Failure(Exit::input, "can't open " + inQuotes(files.front()) +
-                                   ": it is no SCC file, or no line of it has captions");
+    refuseScc(files.front());
 }
 
 void showCaptions(const std::vector<std::string>& files, bool json) {
@@ -84,7 +84,7 @@ void showCaptions(const std::vector<std::string>& files, bool json) {
         QvCcData one;
         if (one.readScc(Any(files[field].c_str()), static_cast<int>(field), false, rate, &dropFrame, true) !=
             0)
-            throw Failure(Exit::input, "can't read " + inQuotes(files[field]) + " again");
+            throw failure(Msg::readFailed, {files[field]});
         all.extend(one);
     }
     all.sort();

@@ -1,5 +1,6 @@
 // One picture of a video, or a sheet of many, as a PNG.
 #include <algorithm>
+#include <cerrno>
 #include <cmath>
 #include <cstdio>
 
@@ -11,7 +12,7 @@
 #include "tarsel/picture/picturereader.h"
 #include "tarsel/source/source.h"
 #include "tarsel/words/commandline.h"
-#include "tarsel/words/failure.h"
+#include "tarsel/words/messages.h"
 #include "tarsel/words/timespec.h"
 
 namespace {
@@ -19,6 +20,7 @@ namespace {
 constexpr long long kTicks = 35280000;
 constexpr int kVideoFilter = 12;
 constexpr int kSheetWidth = 1920;  // pixels a contact sheet is at most wide
+constexpr int kMostCells = 32;     // in each direction
 constexpr int kGap = 8;            // pixels between its pictures
 
 struct Given {
@@ -37,14 +39,14 @@ class Shrinker {
         setChecked(*scaler_, "outWidth", width, "--sheet");
         setChecked(*scaler_, "outHeight", height, "--sheet");
         setChecked(*scaler_, "FOURCC", static_cast<int>(QvFourcc::BGR3), "--sheet");
-        if (scaler_->open() != QvStatus::ok) throw Failure(Exit::failed, scaler_->errorDesc());
+        if (scaler_->open() != QvStatus::ok) throw failure(Msg::sheetFailed, {scaler_->errorDesc()});
     }
     ~Shrinker() { scaler_->close(); }
 
     void convert(const QvFrame& from, QvFrame& to) {
         QvFrame copy(from);
         if (scaler_->write(copy) != QvStatus::ok || scaler_->ready() == 0)
-            throw Failure(Exit::failed, std::string("can't scale the picture: ") + scaler_->errorDesc());
+            throw failure(Msg::sheetFailed, {scaler_->errorDesc()});
         to = *scaler_->frame();
         scaler_->next();
     }
@@ -62,24 +64,21 @@ void save(const QvFrame& picture, const Given& given) {
     const Signals::Watch watch(*given.signals, {.first = {}, .second = leave, .report = {}});
     const std::string name = outputs ? outputs->begin("png") : given.stream->engineName();
     if (picture.four_cc() != QvFourcc::BGR3) makeAnyCodec("scaler", kVideoFilter);  // says that it is missing
-    qv_log()->clear();
+    errno = 0;
     if (QvImage::saveFrame(picture, Any(name.c_str()), 0) != 0) {
-        AnyVector messages;
-        qv_log()->getAll(messages);
-        const std::string reason = messages.empty() ? "" : messages.back().asDict().getString("text", "");
-        throw Failure(Exit::output, "can't write " + inQuotes(given.output) + ": " +
-                                        inLine(outputs ? outputs->withFinalNames(reason)
-                                                       : given.stream->withUserName(reason)));
+        if (errno != 0) throw systemFailure(Msg::outputSystem, given.output, errno);
+        throw failure(Msg::outputRefused, {given.output, "the picture can't be converted to a PNG"});
     }
     if (outputs) outputs->commit("png");
     given.signals->complete();
+    printWarnings();
     std::fprintf(stderr, "tarsel: wrote %s\n", inQuotes(given.output).c_str());
 }
 
+Size parseSheet(const std::string& text) { return parseSize(text, "--sheet", kMostCells, Msg::sheetWrong); }
+
 void saveSheet(PictureReader& reader, const Given& given) {
-    const Size grid = parseSize(given.sheet, "--sheet");
-    if (grid.width > 32 || grid.height > 32)
-        throw Failure(Exit::usage, "--sheet: at most 32x32 pictures fit on a sheet");
+    const Size grid = parseSheet(given.sheet);
     const int width = ((kSheetWidth - kGap) / grid.width - kGap) & ~1;
     const int height = std::max(2, static_cast<int>(std::lround(width / reader.format().aspect)) & ~1);
     QvFrame sheet;
@@ -99,16 +98,15 @@ void saveSheet(PictureReader& reader, const Given& given) {
 
 void frame(Given& given) {
     given.effects.check();
+    if (!given.sheet.empty()) parseSheet(given.sheet);
     const OutputPolicy policy = given.outputOptions.policy();
     given.stream = StreamOutput::find(given.output, {given.input});
     const Any extension = QvFile::getExt(Any(given.output.c_str()), true);
-    if (!given.stream && !(extension == "png"))
-        throw Failure(Exit::usage, "-o " + inQuotes(given.output) + ": a picture is a .png file");
+    if (!given.stream && !(extension == "png")) throw failure(Msg::pictureName, {given.output});
     Source source(given.input, given.raw);
     if (!given.stream)
         given.outputs = std::make_shared<Outputs>(given.output, "-o", std::vector{given.input}, policy);
-    if (source.decoder().nrStreams(1) == 0)
-        throw Failure(Exit::input, inQuotes(given.input) + " has no picture");
+    if (source.decoder().nrStreams(1) == 0) throw failure(Msg::fileNoPicture, {given.input});
     source.selectAll();
     PictureReader reader(source, given.effects);
     if (reader.pipe()) checkFilterFiles(*reader.pipe(), {given.input}, given.outputs.get(), policy);
@@ -116,8 +114,7 @@ void frame(Given& given) {
     const auto rate = source.frameRate();
     const MediaTime at = given.at.empty() ? MediaTime(0LL, kTicks) : parseTime(given.at, rate, "--at");
     if (rate && at.position(*rate) >= source.decoder().nrFrames(0))
-        throw Failure(Exit::usage, "--at " + given.at + " lies behind the end of " + inQuotes(given.input) +
-                                       " (" + formatTime(source.duration()) + ")");
+        throw failure(Msg::atAfterEnd, {given.at, given.input, formatTime(source.duration())});
     const long long number = rate ? at.position(reader.format().rate) : 0;
     save(reader.at(std::min(number, reader.frames() - 1)), given);
 }

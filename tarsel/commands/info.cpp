@@ -1,11 +1,13 @@
+#include <algorithm>
 #include <cstdio>
 
 #include "tarsel/commands/commands.h"
 #include "tarsel/host/console.h"
+#include "tarsel/host/files.h"
 #include "tarsel/source/source.h"
 #include "tarsel/words/commandline.h"
-#include "tarsel/words/failure.h"
 #include "tarsel/words/json.h"
+#include "tarsel/words/messages.h"
 #include "tarsel/words/timespec.h"
 
 namespace {
@@ -129,26 +131,51 @@ void printFile(const Json& file) {
     if (file.contains("damage")) print("  damaged   %s\n", file["damage"].get<std::string>().c_str());
 }
 
+// An installation may have a decoder for other XML files; no installation has one for tasks.
+bool isTaskFile(const std::string& name) {
+    const Any extension = QvFile::getExt(Any(name.c_str()), true);
+    if (!(extension == "xml")) return false;
+    const AnyVector decoders = qv_registry()->decoders("xml");
+    return std::none_of(decoders.begin(), decoders.end(), [](const Any& decoder) {
+        return std::unique_ptr<QvCodec>(qv_registry()->newCodec(decoder.asString())) != nullptr;
+    });
+}
+
+Json describeTask(const std::string& name) {
+    requireInput(name);
+    const QvTaskFault fault = QvTaskFile::check(Any(name.c_str()));
+    if (fault.status == QvStatus::outOfMemory) throw std::bad_alloc();
+    if (fault.line > 0)
+        throw failure(Msg::taskDamaged, {name, std::to_string(fault.line),
+                                         fault.path.empty() ? "the document" : fault.path, fault.reason});
+    if (fault.status != QvStatus::ok) throw failure(Msg::taskRefused, {name, fault.reason});
+    return {{"file", name}, {"task", "sound"}, {"bytes", fileBytes(name)}};
+}
+
 struct Given {
     std::vector<std::string> files;
     std::string raw;
     bool json = false;
 };
 
-// Looks at every file, also behind one that can't be used.
+// Looks at every file, also after one that can't be used.
 void info(const Given& given) {
     Json all = Json::array();
     std::vector<std::string> failures;
     for (const auto& name : given.files) {
         try {
+            if (isTaskFile(name)) {
+                all.push_back(describeTask(name));
+                if (!given.json) print("%s\n  a sound task\n", inQuotes(name).c_str());
+                continue;
+            }
             const Source source(name, given.raw);
             all.push_back(describe(source));
             if (!given.json) printFile(all.back());
             if (all.back().contains("damage"))
-                failures.push_back(inQuotes(name) + " is damaged: " + source.damage());
+                failures.push_back(lineOf(Msg::fileDamaged, {name, source.damage()}));
             else
                 printWarnings();
-            qv_log()->clear();
         } catch (const Failure& failure) {
             if (failure.exit() != Exit::input) throw;
             failures.push_back(failure.what());

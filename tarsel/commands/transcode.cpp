@@ -5,6 +5,7 @@
 #include "tarsel/host/signals.h"
 #include "tarsel/job/job.h"
 #include "tarsel/words/commandline.h"
+#include "tarsel/words/messages.h"
 #include "tarsel/words/timespec.h"
 
 namespace {
@@ -30,12 +31,10 @@ void resolve(Given& given) {
     if (!given.channels.empty())
         job.channels = static_cast<int>(parseNumber(given.channels, 1, 8, "--channels"));
     if (!given.bits.empty()) job.bits = static_cast<int>(parseNumber(given.bits, 8, 24, "--bits"));
-    if (job.bits && *job.bits % 8 != 0)
-        throw Failure(Exit::usage, "--bits: " + inQuotes(given.bits) + " is not 8, 16 or 24");
+    if (job.bits && *job.bits % 8 != 0) throw failure(Msg::bitsWrong, {"--bits", given.bits});
     if (!job.muxer.empty() && job.muxer != "nullmux" && job.muxer != "rawmux" && job.muxer != "rawavimux")
-        throw Failure(Exit::module, "--muxer: there is no multiplexer " + inQuotes(job.muxer) +
-                                        " for this tool." +
-                                        suggestion(job.muxer, {"rawmux", "rawavimux", "nullmux"}));
+        throw failure(Msg::muxerUnknown,
+                      {job.muxer, suggestion(job.muxer, {"rawmux", "rawavimux", "nullmux"})});
     if (given.progress == "json") job.progress = ProgressMode::json;
     if (given.progress == "none") job.progress = ProgressMode::off;
 }

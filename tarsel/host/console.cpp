@@ -3,17 +3,23 @@
 #include <cerrno>
 #include <cstdarg>
 #include <cstdio>
-#include <cstring>
 
 #include <fcntl.h>
 #include <unistd.h>
 
-#include "tarsel/words/failure.h"
+#include "tarsel/words/messages.h"
+#include "tarsel/words/systemcause.h"
 
 namespace {
 
 constexpr size_t kBlock = 1 << 16;
 std::string g_pending;
+
+[[noreturn]] void refuse(int error) {
+    if (error == EPIPE) throw Failure(Exit::output, "");
+    const SystemCause cause = causeOf(error);
+    throw failure(Msg::standardOutput, {cause.why, cause.remedy});
+}
 
 }  // namespace
 
@@ -47,10 +53,7 @@ void flushOutput() {
     for (size_t done = 0; done < text.size();) {
         const ssize_t written = write(STDOUT_FILENO, text.data() + done, text.size() - done);
         if (written < 0 && errno == EINTR) continue;
-        if (written < 0)
-            throw Failure(Exit::output, errno == EPIPE ? ""
-                                                       : std::string("can't write to the standard output: ") +
-                                                             std::strerror(errno));
+        if (written < 0) refuse(errno);
         done += static_cast<size_t>(written);
     }
 }

@@ -2,30 +2,62 @@
 
 #include <cerrno>
 #include <cstdio>
-#include <cstring>
 #include <filesystem>
 
-#include "tarsel/words/failure.h"
+#include "tarsel/words/messages.h"
+#include "tarsel/words/systemcause.h"
 
 namespace fs = std::filesystem;
 
-std::string whyNoFile(const std::string& name) {
-    std::error_code error;
-    const auto status = fs::status(name, error);
-    if (fs::is_directory(status)) return "this is a folder";
-    if (!fs::exists(status))
-        return error && error != std::errc::no_such_file_or_directory ? inLine(error.message())
-                                                                      : "no such file";
-    return fs::is_regular_file(status) ? "" : "this is no regular file";
+namespace {
+
+[[noreturn]] void refuseInput(const std::string& name, int error) {
+    throw systemFailure(Msg::inputSystem, name, error);
 }
 
-std::string whyNoInput(const std::string& name) {
-    if (const std::string why = whyNoFile(name); !why.empty()) return why;
-    if (fileBytes(name) == 0) return "the file is empty";
+}  // namespace
+
+void requireFile(const std::string& name) {
+    std::error_code error;
+    const auto status = fs::status(name, error);
+    if (fs::is_regular_file(status)) return;
+    if (fs::is_directory(status)) throw failure(Msg::inputIsFolder, {name});
+    if (fs::exists(status)) throw failure(Msg::inputNotRegular, {name});
+    if (error && error != std::errc::no_such_file_or_directory) refuseInput(name, error.value());
+    throw failure(Msg::inputAbsent, {name});
+}
+
+void requireInput(const std::string& name) {
+    requireFile(name);
+    if (fileBytes(name) == 0) throw failure(Msg::inputEmpty, {name});
     FILE* file = std::fopen(name.c_str(), "rb");
-    if (!file) return std::strerror(errno);
+    if (!file) refuseInput(name, errno);
     std::fclose(file);
-    return "";
+}
+
+void requireLog(const std::string& name) {
+    if (isDevice(name)) return;
+    FILE* file = std::fopen(name.c_str(), "ab");
+    if (!file) throw systemFailure(Msg::logNotWritten, name, errno);
+    std::fclose(file);
+}
+
+Failure failureOf(const std::system_error& error) {
+    const SystemCause cause = causeOf(error.code().value());
+    const auto* failed = dynamic_cast<const fs::filesystem_error*>(&error);
+    if (!failed) return failure(Msg::systemFailed, {cause.why, cause.remedy});
+    const std::string path = failed->path1().string();
+    // Only the search for a temporary folder names none.
+    if (path.empty()) return failure(Msg::temporaryFolder, {cause.why});
+    return failure(Msg::pathFailed, {path.substr(0, path.find("/.tarsel-")), cause.why, cause.remedy});
+}
+
+std::string firstBytes(const std::string& name, size_t most) {
+    std::string bytes(most, '\0');
+    FILE* file = std::fopen(name.c_str(), "rb");
+    bytes.resize(file ? std::fread(bytes.data(), 1, most, file) : 0);
+    if (file) std::fclose(file);
+    return bytes;
 }
 
 std::string whyNoFolder(const std::string& name) {

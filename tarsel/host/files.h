@@ -2,12 +2,25 @@
 #pragma once
 
 #include <string>
+#include <system_error>
 
-// Why `name` can't be an input: "this is a folder", "no such file", "this is no regular file" or the system's
-// own words; "" for a regular file. Symbolic links are followed, and the file is not opened.
-std::string whyNoFile(const std::string& name);
-// The same; then also "the file is empty", and why the file does not open.
-std::string whyNoInput(const std::string& name);
+#include "tarsel/words/failure.h"
+
+// Throws Failure (input) unless `name` is a regular file. Symbolic links are followed, and the file is not
+// opened.
+void requireFile(const std::string& name);
+// The same; then also for a file that is empty or does not open.
+void requireInput(const std::string& name);
+
+// Throws Failure (output) if the engine's log can't be written to `name`, which may make the file.
+void requireLog(const std::string& name);
+
+// What a call of the standard library ran into that nothing else has caught. Of a hidden work folder, the
+// folder that it is in is named.
+Failure failureOf(const std::system_error& error);
+
+// The first bytes of a file, fewer where it ends or fails before.
+std::string firstBytes(const std::string& name, size_t most);
 
 // Why `name` is no folder whose entries can be read, in the same words; "" if it is one.
 std::string whyNoFolder(const std::string& name);

@@ -57,6 +57,10 @@ Job::Job(const JobOptions& options, Signals& signals)
 
 Job::~Job() = default;
 
+const std::string& Job::outputName() const {
+    return options_.output.empty() ? options_.inputs.front() : options_.output;
+}
+
 bool Job::hasVideo() const {
     return std::any_of(streams_.begin(), streams_.end(), [](const auto& s) { return s.type == kVideo; });
 }
@@ -105,12 +109,12 @@ void Job::checkStream() const {
 }
 
 void Job::openInputs() {
-    if (options_.inputs.empty()) throw Failure(Exit::usage, "no input; give a file or testgen:...");
+    if (options_.inputs.empty()) throw failure(Msg::inputMissing);
     // Beside a raw file there may be others, such as its sound.
     const bool onlyOne = options_.inputs.size() == 1;
     const auto isRaw = [&](const auto& name) { return onlyOne || !Source::describesItself(name); };
     if (!options_.raw.empty() && std::none_of(options_.inputs.begin(), options_.inputs.end(), isRaw))
-        throw Failure(Exit::usage, "--raw describes a raw file; no input is one");
+        throw failure(Msg::rawNoInput);
     for (const auto& name : options_.inputs) {
         sources_.push_back(std::make_unique<Source>(name, isRaw(name) ? options_.raw : ""));
         sources_.back()->selectAll();
@@ -138,10 +142,8 @@ void Job::checkDamage() {
     for (const auto& source : sources_) {
         const std::string damage = source->damage();
         if (damage.empty()) continue;
-        if (!options_.acceptPartial)
-            throw Failure(Exit::input, inQuotes(source->name()) + " is damaged: " + damage +
-                                           "; --accept-partial takes what is there");
-        warnings_.push_back(inQuotes(source->name()) + " is damaged: " + damage);
+        if (!options_.acceptPartial) throw failure(Msg::inputDamaged, {source->name(), damage});
+        warnings_.push_back(lineOf(Msg::inputDamagedTaken, {source->name(), damage}));
     }
 }
 
@@ -153,23 +155,19 @@ void Job::planStreams() {
             for (int i = 0; i < source->decoder().nrStreams(type); ++i) planStream(*source, type, i);
         }
     if (streams_.empty())
-        throw Failure(Exit::input, kind_ == OutputKind::wav
-                                       ? "no input has sound for " + inQuotes(options_.output)
-                                       : std::string("no input has a picture or sound"));
+        throw failure(kind_ == OutputKind::wav ? Msg::inputNoSound : Msg::inputNoStreams, {outputName()});
     if (kind_ == OutputKind::byInput) kind_ = hasVideo() ? OutputKind::raw : OutputKind::wav;
     checkPicture();
     // As captions, of which raw pictures hold none.
     for (const auto& source : sources_)
         if (std::none_of(streams_.begin(), streams_.end(),
                          [&](const auto& s) { return s.source == source.get(); }))
-            warnings_.push_back("nothing of " + inQuotes(source->name()) + " goes into the output");
+            warnings_.push_back(lineOf(Msg::inputUnused, {source->name()}));
 }
 
 void Job::checkPicture() const {
     const bool sound = kind_ == OutputKind::wav || kind_ == OutputKind::nothing;
-    if (!sound && !hasVideo())
-        throw Failure(Exit::input, "no input has a picture for " + inQuotes(options_.output) +
-                                       "; sound alone is written as .wav");
+    if (!sound && !hasVideo()) throw failure(Msg::inputNoPicture, {options_.output});
 }
 
 void Job::planStream(Source& source, int type, int number) {
@@ -217,20 +215,19 @@ void Job::planPoints() {
         auto rate = stream.source->frameRate();
         if (!rate && picture != streams_.end()) rate = picture->source->frameRate();
         const MediaTime length = endOf(stream);
-        const std::string end =
-            "the end of " + inQuotes(stream.source->name()) + " (" + formatTime(length.seconds()) + ")";
+        const std::string end = formatTime(length.seconds());
         stream.in = MediaTime(0LL, kTicks);
         stream.out = length;
         if (!options_.from.empty()) stream.in = parseTime(options_.from, rate, "--from");
         if (!options_.to.empty()) stream.out = parseTime(options_.to, rate, "--to");
         if (stream.out <= stream.in && !options_.to.empty())
-            throw Failure(Exit::usage, "--to " + options_.to + " is not behind " +
-                                           (options_.from.empty() ? "the start" : "--from " + options_.from));
+            throw failure(Msg::toNotAfter,
+                          {options_.to, options_.from.empty() ? "the start" : "--from " + options_.from});
         if (stream.in >= length && !options_.from.empty())
-            throw Failure(Exit::usage, "--from " + options_.from + " lies behind " + end);
+            throw failure(Msg::fromAfterEnd, {options_.from, stream.source->name(), end});
         if (stream.out > length) {
             if (stream.type == kVideo || !hasVideo())
-                warnings_.push_back("--to " + options_.to + " lies behind " + end + "; stopped there");
+                warnings_.push_back(lineOf(Msg::toAfterEnd, {options_.to, stream.source->name(), end}));
             stream.out = length;
         }
     }
@@ -249,9 +246,8 @@ void Job::planLengths() {
             if (std::abs(2.0 * stream.rate.rate() - static_cast<double>(from)) < 1e-4 && stream.inUnits % 2)
                 stream.expected = (stream.inUnits + 1) / 2;
             if (stream.expected < 1 || stream.inUnits < 1)
-                throw Failure(Exit::usage, "there is no frame of " + inQuotes(stream.source->name()) +
-                                               " between " + formatTime(stream.in.seconds()) + " and " +
-                                               formatTime(stream.out.seconds()));
+                throw failure(Msg::noFrameBetween, {stream.source->name(), formatTime(stream.in.seconds()),
+                                                    formatTime(stream.out.seconds())});
             video = &stream;
         }
     }
@@ -279,18 +275,17 @@ std::string Job::primaryExtension() const {
 
 void Job::buildPipe() {
     pipe_.reset(QvEncodePipe::create());
-    if (!pipe_) throw Failure(Exit::module, "this installation can't write any output");
+    if (!pipe_) throw failure(Msg::outputNoModule, {outputName()});
     if (kind_ == OutputKind::avi && !writesNothing()) {
         if (!qvPresetMgr()->profileAvailable(QvProfile::aviRaw))
-            throw Failure(Exit::module, "this installation has no AVI output");
+            throw failure(Msg::aviNoModule, {options_.output});
         pipe_->applyPreset(QvProfile::aviRaw, 0);
     }
     pipe_->clearStreams();
     const char* muxer = writesNothing() ? "nullmux" : kind_ == OutputKind::avi ? "rawavimux" : "rawmux";
     if (std::string_view(pipe_->getMuxer() ? pipe_->getMuxer()->name() : "") != muxer &&
         pipe_->setMuxer(muxer) != QvStatus::ok)
-        throw Failure(Exit::module,
-                      std::string("the multiplexer ") + muxer + " can't be used: " + pipe_->errorDesc());
+        throw failure(Msg::muxerUnusable, {muxer, pipe_->errorDesc()});
     QvMuxer& m = *pipe_->getMuxer();
     if (kind_ == OutputKind::pictures && !writesNothing()) {
         m.setParam("splitVideo", 1);
@@ -304,9 +299,7 @@ void Job::buildPipe() {
 void Job::addStream(JobStream& stream) {
     const char* module = stream.type == kVideo ? "rawvenc" : "rawaenc";
     if (pipe_->addStream(stream.type, Any(module)) < 0)
-        throw Failure(Exit::output, std::string("the output takes no further ") +
-                                        (stream.type == kVideo ? "picture" : "sound") + ": " +
-                                        pipe_->errorDesc());
+        throw failure(Msg::outputNoStream, {outputName(), stream.type == kVideo ? "picture" : "sound"});
     QvEncoder& encoder = *pipe_->encoder(stream.type, stream.encStream);
     if (stream.type == kVideo) {
         setChecked(encoder, "type", static_cast<int>(stream.fourcc), "--pixel");
@@ -345,13 +338,13 @@ void Job::checkNames() const {
 // What was asked for has to have something that it works on.
 void Job::checkEffects() const {
     if (const std::string option = options_.effects.given(); !option.empty() && !hasVideo())
-        throw Failure(Exit::usage, option + ": this job has no picture");
+        throw failure(Msg::effectNoPicture, {option});
     for (const auto& spec : options_.effects.filters) {
         const int type = filterType(spec);
         if (std::any_of(streams_.begin(), streams_.end(), [&](const auto& s) { return s.type == type; }))
             continue;
-        throw Failure(Exit::usage, "--filter " + spec.substr(0, spec.find(':')) + ": this job has no " +
-                                       (type == kVideo ? "picture" : "sound"));
+        throw failure(Msg::filterNoStream,
+                      {spec.substr(0, spec.find(':')), type == kVideo ? "picture" : "sound"});
     }
 }
 
@@ -395,15 +388,8 @@ void Job::planSound(JobStream& stream) const {
 
 // What the engine told its user, each line once.
 void Job::takeWarnings() {
-    constexpr int warning = 4;
-    AnyVector messages;
-    qv_log()->getAll(messages);
-    for (int i = 0; i < messages.size(); ++i) {
-        const AnyDict& message = messages.at(i).asDict();
-        const std::string text = inLine(withFinalNames(message.getString("text", "")));
-        if (message.getInt32("type", 0) == warning &&
-            std::find(warnings_.begin(), warnings_.end(), text) == warnings_.end())
-            warnings_.push_back(text);
+    for (const std::string& text : engineWarnings()) {
+        const std::string line = lineOf(Msg::engineWarns, {withFinalNames(text)});
+        if (std::find(warnings_.begin(), warnings_.end(), line) == warnings_.end()) warnings_.push_back(line);
     }
-    qv_log()->clear();
 }

@@ -116,6 +116,7 @@ class Job {
     void runPost(const std::vector<std::string>& names) const;
     void showWarnings() const;
     std::string primaryExtension() const;
+    const std::string& outputName() const;  // for messages
     bool hasVideo() const;
     bool writesNothing() const;
     bool takesOneStream() const;

@@ -27,11 +27,8 @@ long long samplesOf(const fs::path& file) {
 }
 
 [[noreturn]] void differs(const std::string& name, long long found, long long wanted, const char* unit) {
-    if (found < 0)
-        throw Failure(Exit::check, inQuotes(name) + " can't be read back; nothing was left behind");
-    throw Failure(Exit::check, inQuotes(name) + " is not what was asked for: " + std::to_string(found) +
-                                   " instead of " + std::to_string(wanted) + " " + unit +
-                                   "; nothing was left behind");
+    if (found < 0) throw failure(Msg::outputUnreadable, {name});
+    throw failure(Msg::outputDiffers, {name, std::to_string(found), unit, std::to_string(wanted)});
 }
 
 }  // namespace
@@ -44,11 +41,10 @@ void Job::checkResult() {
         if (s.written == s.expected) continue;
         // Sound that has all been written may end within the last frame of the picture.
         if (s.written == s.own && s.expected - s.written <= s.frame) continue;
-        const std::string line = inQuotes(s.source->name()) + " ended early: " + std::to_string(s.written) +
-                                 " of " + std::to_string(s.expected) + " " + unit + " were read";
-        if (!options_.acceptPartial)
-            throw Failure(Exit::input, line + "; --accept-partial keeps what is there");
-        warnings_.push_back(line);
+        const std::string read = std::to_string(s.written), wanted = std::to_string(s.expected);
+        const std::string& name = s.source->name();
+        if (!options_.acceptPartial) throw failure(Msg::inputEndedEarly, {name, read, wanted, unit});
+        warnings_.push_back(lineOf(Msg::inputPartlyRead, {name, read, wanted, unit}));
     }
     if (outputs_) checkFiles();
     if (takesOneStream()) checkTaken();

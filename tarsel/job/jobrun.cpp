@@ -94,7 +94,7 @@ class Job::Runner : public QvTranscoder {
         for (int i = 0; i < messages.size(); ++i)
             if (messages.at(i).asDict().getInt32("type", 0) == kErrorLine)
                 return messages.at(i).asDict().getString("text", "");
-        return *errorDesc() ? errorDesc() : "the job failed; --log FILE tells more";
+        return *errorDesc() ? errorDesc() : "the engine gives no reason";
     }
 
     void togglePause() { isPaused() ? unpause() : pause(); }
@@ -132,9 +132,8 @@ class Job::Runner : public QvTranscoder {
 
     Failure failureOf(const QvCodec& filter) const {
         const bool writes = !filterFile(filter, QV_GUI_FILESELECT_SAVE).empty();
-        return {writes ? Exit::output : Exit::failed, "the filter " + std::string(filter.name()) + ": " +
-                                                          inLine(job_.withFinalNames(filter.errorDesc())) +
-                                                          (writes ? "" : "; nothing was left behind")};
+        return failure(writes ? Msg::filterWriteFailed : Msg::filterFailed,
+                       {filter.name(), job_.withFinalNames(filter.errorDesc())});
     }
 
     static constexpr auto kSlowStop = std::chrono::seconds(1);
@@ -161,8 +160,7 @@ void Job::checkSpace() const {
     if (kind_ != OutputKind::pictures)
         for (const JobStream& stream : streams_) need += stream.bytes(stream.expected);
     if (space >= 0 && need > space)
-        throw Failure(Exit::output, "can't write " + inQuotes(outputs_->output().string()) + ": it needs " +
-                                        formatBytes(need) + ", the disk has " + formatBytes(space) + " free");
+        throw failure(Msg::outputNoSpace, {outputName(), formatBytes(need), formatBytes(space)});
 }
 
 void Job::link(Runner& runner) const {
@@ -173,7 +171,7 @@ void Job::link(Runner& runner) const {
     runner.setParam("progress", off);
     for (const JobStream& s : streams_)
         if (runner.link(&s.source->decoder(), s.type, s.decStream, s.encStream, s.params) < 0)
-            throw Failure(Exit::failed, inLine(runner.errorDesc()));
+            throw failure(Msg::linkFailed, {s.source->name()});
     runner.ready();
 }
 
@@ -329,28 +327,25 @@ void Job::fail(Runner& runner, int result) const {
         throw failure(Msg::runOutOfMemory, {options_.output});
     for (const auto& source : sources_)
         if (source->decoder().errorCode() < 0 && source->decoder().errorCode() != QvStatus::endOfStream)
-            throw Failure(Exit::input, "can't read " + inQuotes(source->name()) + ": " +
-                                           inLine(source->decoder().errorDesc()));
+            throw failure(Msg::readFailed, {source->name()});
     std::string reason;
     const auto take = [&](const QvCodec* codec) {
         if (reason.empty() && codec && codec->errorCode() != 0) reason = codec->errorDesc();
     };
     for (const JobStream& s : streams_)
         if (const QvBufStream* file = pipe_->getMuxer()->stream(s.type, s.encStream);
-            file && reason.empty()) {
+            file && file->ioError() != 0) {
             if (stream_ && file->ioError() == EPIPE) throw failure(Msg::streamReaderGone, {stream_->name()});
-            reason = file->ioErrorText();
+            throw systemFailure(Msg::outputSystem, outputName(), file->ioError());
         }
     for (const JobStream& s : streams_) take(pipe_->encoder(s.type, s.encStream));
     take(pipe_->getMuxer());
     take(pipe_->sink());
     take(pipe_.get());
-    if (!reason.empty() && (outputs_ || stream_))
-        throw Failure(Exit::output,
-                      "can't write " + inQuotes(options_.output) + ": " + inLine(withFinalNames(reason)));
+    if (!reason.empty() && (outputs_ || stream_)) throw writeFailure(outputName(), withFinalNames(reason));
     if (runner.filterFailure()) throw *runner.filterFailure();
     reason = runner.reason();
-    throw Failure(Exit::failed, inLine(withFinalNames(reason)));
+    throw failure(Msg::jobFailed, {outputName(), withFinalNames(reason)});
 }
 
 void Job::showWarnings() const {
@@ -392,8 +387,7 @@ void Job::runPost(const std::vector<std::string>& names) const {
     if (const Exit signalled = signals_.received(); signalled != Exit::done)
         stopWith(signalled, Msg::stoppedInPost);
     if (status == 0) return;
-    throw Failure(Exit::failed, "the command of --post " +
-                                    (status < 0 ? std::string("can't be run")
-                                                : "ended with status " + std::to_string(status)) +
-                                    (names.empty() ? "" : "; " + inQuotes(names.front()) + " is complete"));
+    const std::string name = outputName();
+    if (status < 0) throw failure(Msg::postNotRun, {name});
+    throw failure(Msg::postFailed, {std::to_string(status), name});
 }

@@ -3,16 +3,12 @@
 #include <cmath>
 
 #include "tarsel/picture/overlays.h"
-#include "tarsel/words/failure.h"
+#include "tarsel/words/messages.h"
 #include "tarsel/words/timespec.h"
 
 namespace {
 
 constexpr int kLeast = 4;  // pixels that have to be left
-
-[[noreturn]] void refuse(const std::string& text, const std::string& why) {
-    throw Failure(Exit::usage, "--crop: " + inQuotes(text) + " " + why);
-}
 
 std::string sizeText(int width, int height) { return std::to_string(width) + "x" + std::to_string(height); }
 
@@ -37,7 +33,7 @@ int takeOffset(std::string_view& rest, int room, const std::string& text) {
     const char* begin = rest.data() + 1;
     const auto [end, error] = std::from_chars(begin, rest.data() + rest.size(), value);
     if (rest.size() < 2 || (rest[0] != '+' && rest[0] != '-') || *begin == '-' || error != std::errc())
-        refuse(text, "is not a part of a picture: use WxH, WxH+X+Y or W:H");
+        throw failure(Msg::cropWrong, {"--crop", text});
     const bool fromEnd = rest[0] == '-';
     rest.remove_prefix(static_cast<size_t>(end - rest.data()));
     return fromEnd ? room - value : value;
@@ -56,7 +52,7 @@ QvRect ofAspect(const std::string& text, size_t colon, const PictureFormat& pict
     const Grid grid = gridOf(picture);
     width = width / grid.columns * grid.columns;
     height = height / grid.rows * grid.rows;
-    if (width < kLeast || height < kLeast) refuse(text, "leaves nothing of the picture");
+    if (width < kLeast || height < kLeast) throw failure(Msg::cropEmpty, {text});
     const int x = (picture.width - width) / 2 / grid.columns * grid.columns;
     const int y = (picture.height - height) / 2 / grid.rows * grid.rows;
     return QvRect(x, y, x + width, y + height);
@@ -66,15 +62,13 @@ void check(const std::string& text, const QvRect& box, const PictureFormat& pict
     const std::string of = sizeText(picture.width, picture.height);
     if (box.width() > picture.width || box.height() > picture.height || box.left() < 0 || box.top() < 0 ||
         box.right() > picture.width || box.bottom() > picture.height)
-        refuse(text, "lies beyond the picture, which is " + of);
-    if (box.width() < kLeast || box.height() < kLeast) refuse(text, "leaves less than 4x4 pixels");
+        throw failure(Msg::cropBeyond, {text, of});
+    if (box.width() < kLeast || box.height() < kLeast) throw failure(Msg::cropEmpty, {text});
     const Grid grid = gridOf(picture);
     if (box.left() % grid.columns != 0 || box.width() % grid.columns != 0)
-        refuse(text, "cuts between pixels that belong together; use an even width and X");
+        throw failure(Msg::cropColumns, {text});
     if (box.top() % grid.rows != 0 || (grid.rows > 1 && box.height() % 2 != 0))
-        refuse(text,
-               "cuts between lines that belong together; use an even height, and a Y that is a multiple of " +
-                   std::to_string(grid.rows));
+        throw failure(Msg::cropRows, {text, std::to_string(grid.rows)});
 }
 
 }  // namespace
@@ -83,15 +77,15 @@ QvRect parseCrop(const std::string& text, const PictureFormat& picture) {
     if (const size_t colon = text.find(':'); colon != std::string::npos)
         return ofAspect(text, colon, picture);
     const size_t signs = std::min(text.find_first_of("+-"), text.size());
-    const Size size = parseSize(std::string_view(text).substr(0, signs), "--crop");
+    const Size size = parseSize(std::string_view(text).substr(0, signs), "--crop", 65535, Msg::cropWrong);
     const Grid grid = gridOf(picture);
     int x = (picture.width - size.width) / 2 / grid.columns * grid.columns;
     int y = (picture.height - size.height) / 2 / grid.rows * grid.rows;
     if (std::string_view rest = std::string_view(text).substr(signs); !rest.empty()) {
         x = takeOffset(rest, picture.width - size.width, text);
-        if (rest.empty()) refuse(text, "is not a part of a picture: use WxH, WxH+X+Y or W:H");
+        if (rest.empty()) throw failure(Msg::cropWrong, {"--crop", text});
         y = takeOffset(rest, picture.height - size.height, text);
-        if (!rest.empty()) refuse(text, "is not a part of a picture: use WxH, WxH+X+Y or W:H");
+        if (!rest.empty()) throw failure(Msg::cropWrong, {"--crop", text});
     }
     const QvRect box(x, y, x + size.width, y + size.height);
     check(text, box, picture);

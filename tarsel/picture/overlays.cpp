@@ -5,8 +5,9 @@
 #include <cmath>
 
 #include "tarsel/host/files.h"
-#include "tarsel/words/failure.h"
+#include "tarsel/source/picturefile.h"
 #include "tarsel/words/keyvalues.h"
+#include "tarsel/words/messages.h"
 #include "tarsel/words/timespec.h"
 
 namespace {
@@ -15,11 +16,6 @@ constexpr int kVideoFilter = 12;
 constexpr int kLinesOfText = 18;  // of subtitles that would fill a picture
 constexpr int kLeastText = 14;    // pixels
 constexpr int kShadow = 2;        // fontEffect
-
-void checkFile(const std::string& name, const std::string& option) {
-    if (const std::string why = whyNoFile(name); !why.empty())
-        throw Failure(Exit::input, option + ": can't open " + inQuotes(name) + ": " + why);
-}
 
 constexpr struct {
     const char* name;
@@ -36,9 +32,7 @@ int parseColour(const std::string& text, const std::string& option) {
     int rgb = 0;
     const auto [end, error] = std::from_chars(digits.data(), digits.data() + digits.size(), rgb, 16);
     if (digits.size() != 6 || digits[0] == '-' || error != std::errc() || end != digits.data() + 6)
-        throw Failure(Exit::usage,
-                      option + ": " + inQuotes(text) +
-                          " is not a colour: use RRGGBB in hexadecimal digits, or a name such as yellow");
+        throw failure(Msg::colourWrong, {option, text});
     return rgb;
 }
 
@@ -47,9 +41,10 @@ double parseDecimal(const std::string& text, double low, double high, const std:
     const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), value);
     if (error == std::errc() && end == text.data() + text.size() && value >= low && value <= high)
         return value;
-    char range[64];
-    std::snprintf(range, sizeof range, " is not a number from %g to %g", low, high);
-    throw Failure(Exit::usage, option + ": " + inQuotes(text) + range);
+    char from[32], to[32];
+    std::snprintf(from, sizeof from, "%g", low);
+    std::snprintf(to, sizeof to, "%g", high);
+    throw failure(Msg::decimalWrong, {option, text, from, to});
 }
 
 // Of the names that a parameter offers; a number stands for itself.
@@ -67,20 +62,19 @@ int parseEncoding(const std::string& text, const QvCodec& filter, const std::str
         known.push_back(lower(row.getString("name", "")));
         if (lower(text) == known.back() || text == std::to_string(identifier)) return identifier;
     }
-    throw Failure(Exit::usage,
-                  option + ": there is no encoding " + inQuotes(text) + "." + suggestion(lower(text), known));
+    throw failure(Msg::encodingUnknown, {option, text, suggestion(lower(text), known)});
 }
 
 int parseEffect(const std::string& text, const std::string& option) {
     const std::vector<std::string> names = {"none", "outline", "shadow", "hard"};
     const auto found = std::find(names.begin(), names.end(), text);
     if (found == names.end())
-        throw Failure(Exit::usage, option + ": there is no effect " + inQuotes(text) + "." +
-                                       suggestion(text, names) + " Use none, outline, shadow or hard");
+        throw failure(Msg::nameUnknown,
+                      {option, "effect", text, suggestion(text, names), "none, outline, shadow or hard"});
     return static_cast<int>(found - names.begin());
 }
 
-// A name and the numbers behind its last "@", if these are numbers.
+// A name and the numbers after its last "@", if these are numbers.
 struct Placed {
     std::string file;
     int x = 0, y = 0;
@@ -112,13 +106,16 @@ Placed parsePlaced(const std::string& spec) {
     if (good) return placed;
     // A name may hold an "@" as well.
     if (exists(spec)) return {spec, 0, 0, {}};
-    throw Failure(Exit::usage,
-                  "--logo: " + inQuotes(spec) + ": " + inQuotes(std::string_view(spec).substr(at)) +
-                      " is no place: use FILE@X,Y or FILE@X,Y,OPACITY with an opacity from 0 to 1");
+    throw failure(Msg::placeWrong, {spec, std::string_view(spec).substr(at)});
 }
 
 // Any other file is one with moving pictures.
 bool isStill(const std::string& name) { return QvFile::getExt(Any(name.c_str()), true) == "png"; }
+
+void requireMovie(const std::string& name) {
+    const std::unique_ptr<QvDecodePipe> decoder(QvDecFactory::decodePipe(Any(name.c_str())));
+    if (!decoder || decoder->nrStreams(1) == 0) throw failure(Msg::logoNoPicture, {name});
+}
 
 void setColour(QvCodec& filter, int rgb, const std::string& option) {
     setChecked(filter, "colorR", rgb >> 16, option);
@@ -126,16 +123,14 @@ void setColour(QvCodec& filter, int rgb, const std::string& option) {
     setChecked(filter, "colorB", rgb & 255, option);
 }
 
-// The frame number that a run begins with, and whether it is told as drop frame.
+// The frame number that a run begins with, and whether it counts in drop frame.
 void setStart(QvCodec& filter, const std::string& text, const PictureFormat& picture, bool alone) {
     const std::string option = "--timecode: start";
     const MediaTime start = parseTime(text, picture.rate, option);
     const bool drop = text.find(';') != std::string::npos;
     const bool ntsc = picture.rate.is29p() || picture.rate.is59i() || picture.rate.is59p();
     if (drop && !ntsc)
-        throw Failure(Exit::usage, option + ": " + inQuotes(text) + " is drop frame, which " +
-                                       std::string(picture.rate.desc(true, true).asString()) +
-                                       " frames a second don't have; use ':'");
+        throw failure(Msg::dropFrameNone, {option, text, picture.rate.desc(true, true).asString()});
     if (drop) setChecked(filter, "dropFrame", 1, option);
     setChecked(filter, "start", alone ? "InPoint" : "FirstInputFrame", option);
     setChecked(filter, "startOffset", static_cast<int>(-start.position(picture.rate)), option);
@@ -155,14 +150,16 @@ bool logoIsMoving(const std::string& spec) { return !isStill(parsePlaced(spec).f
 AnyDict logoState(const std::string& spec, const PictureFormat& picture) {
     const std::string option = "--logo";
     const Placed placed = parsePlaced(spec);
-    if (placed.file.empty()) throw Failure(Exit::usage, option + ": " + inQuotes(spec) + " names no file");
-    checkFile(placed.file, option);
+    if (placed.file.empty()) throw failure(Msg::logoNoFile, {spec});
+    requireInput(placed.file);
+    if (isStill(placed.file)) requirePicture(placed.file);
     const auto filter = makeAnyCodec(isStill(placed.file) ? "logo" : "animatedlogo", kVideoFilter);
     if (std::abs(static_cast<long long>(placed.x)) >= picture.width ||
         std::abs(static_cast<long long>(placed.y)) >= picture.height)
-        throw Failure(Exit::usage, option + ": " + inQuotes(spec) + " lies beyond the picture, which is " +
-                                       std::to_string(picture.width) + "x" + std::to_string(picture.height));
+        throw failure(Msg::logoBeyond,
+                      {spec, std::to_string(picture.width) + "x" + std::to_string(picture.height)});
     setChecked(*filter, "filename", placed.file.c_str(), option);
+    if (!isStill(placed.file)) requireMovie(placed.file);
     setChecked(*filter, "xpos", placed.x, option);
     setChecked(*filter, "ypos", placed.y, option);
     if (placed.opacity) setChecked(*filter, "alpha", *placed.opacity, option);
@@ -172,7 +169,8 @@ AnyDict logoState(const std::string& spec, const PictureFormat& picture) {
 namespace {
 
 void setFont(QvCodec& filter, const std::string& file, const std::string& what) {
-    checkFile(file, what);
+    requireInput(file);
+    if (!QvText::isFont(Any(file.c_str()))) throw failure(Msg::fontWrong, {what, file});
     setChecked(filter, "font_filename", file.c_str(), what);
 }
 
@@ -203,7 +201,7 @@ void setTextSize(QvCodec& filter, int size, const PictureFormat& picture, const 
 
 void setMode(QvCodec& filter, const std::string& mode, const std::string& what) {
     if (mode != "timecode" && mode != "frames")
-        throw Failure(Exit::usage, what + ": " + inQuotes(mode) + " is neither timecode nor frames");
+        throw failure(Msg::nameUnknown, {what, "mode", mode, "", "timecode or frames"});
     setChecked(filter, "mode", mode == "frames" ? "Frame number" : "Timecode", what);
 }
 
@@ -223,9 +221,22 @@ void setTimecode(QvCodec& filter, const std::string& key, const std::string& val
 
 }  // namespace
 
+namespace {
+
+// Nothing to burn in is no result.
+void requireSubtitles(const std::string& file) {
+    requireInput(file);
+    QvSubtitles read;
+    if (read.parseFile(file.c_str(), QvFramerate(QvRatio(25, 1))) != QvStatus::ok ||
+        (read.nrSubtitles() == 0 && read.unread() == 0))
+        throw failure(Msg::subtitlesNone, {file});
+}
+
+}  // namespace
+
 AnyDict subtitleState(const std::string& file, const std::string& style, const PictureFormat& picture) {
     const std::string option = "--subtitles";
-    checkFile(file, option);
+    requireSubtitles(file);
     const auto filter = makeAnyCodec("subtitle", kVideoFilter);
     setChecked(*filter, "subtitle_filename", file.c_str(), option);
     setChecked(*filter, "font_size", std::max(picture.height / kLinesOfText, kLeastText), option);
@@ -252,7 +263,7 @@ AnyDict timecodeState(const std::string& spec, const PictureFormat& picture, boo
                                    : spec,
                          {"start", "mode", "x", "y", "size", "color", "font"}, option);
     for (const auto& [key, value] : keys.all()) setTimecode(*filter, key, value, picture, alone);
-    if (!keys.find("x") != !keys.find("y")) throw Failure(Exit::usage, option + ": x and y go together");
+    if (!keys.find("x") != !keys.find("y")) throw failure(Msg::pairIncomplete, {option, "x", "y"});
     return stateOf(*filter);
 }
 

@@ -8,8 +8,8 @@
 #include "tarsel/host/files.h"
 #include "tarsel/host/memory.h"
 #include "tarsel/picture/overlays.h"
-#include "tarsel/words/failure.h"
 #include "tarsel/words/keyvalues.h"
+#include "tarsel/words/messages.h"
 #include "tarsel/words/timespec.h"
 
 namespace {
@@ -83,7 +83,7 @@ int intParam(const QvDecodePipe& decoder, int stream, const char* name) {
 int matrixNumber(std::string_view text, const std::string& all) {
     if (text == "601") return 1;
     if (text == "709") return 2;
-    throw Failure(Exit::usage, "--matrix: " + inQuotes(all) + " is not 601, 709, or IN:OUT of these");
+    throw failure(Msg::matrixWrong, {all});
 }
 
 }  // namespace
@@ -96,8 +96,7 @@ int filterType(const std::string& spec) {
     if (kind == kAudioFilter) return kAudio;
     std::vector<std::string> known = moduleNames(kVideoFilter);
     for (const auto& audio : moduleNames(kAudioFilter)) known.push_back(audio);
-    throw Failure(Exit::module, "--filter: there is no filter " + inQuotes(name) + "." +
-                                    suggestion(name, known) + " 'tarsel modules' lists all");
+    throw failure(Msg::filterUnknown, {name, suggestion(name, known)});
 }
 
 AnyDict filterState(const std::string& spec) {
@@ -141,9 +140,8 @@ PictureEffects::PictureEffects(const EffectOptions& options, const Source& sourc
     planRate();
     if (!options_.pixel.empty()) out_.fourcc = parsePixel(options_.pixel, "--pixel");
     planMatrix(toPng);
-    if (options_.subtitles.empty() && !options_.subtitleStyle.empty())
-        throw Failure(Exit::usage,
-                      "--subtitle-style: there are no subtitles; give them with --subtitles FILE");
+    if (options_.subtitles.empty() && !options_.subtitleStyle.empty()) throw failure(Msg::styleAlone);
+    if (!options_.size.empty()) requireFrame("--size", frameFormat(out_.fourcc), out_.width, out_.height);
 }
 
 void PictureEffects::planDeinterlace() {
@@ -153,13 +151,9 @@ void PictureEffects::planDeinterlace() {
     deinterlace_ = options_.deinterlace == "true" ? "top" : options_.deinterlace;
     const std::vector<std::string> known = {"top", "bottom", "bob", "double", "reverse"};
     if (std::find(known.begin(), known.end(), deinterlace_) == known.end())
-        throw Failure(Exit::usage, "--deinterlace: there is no method " + inQuotes(deinterlace_) + "." +
-                                       suggestion(deinterlace_, known) +
-                                       " Use top, bottom, bob, double or reverse");
-    if (order == 0)
-        throw Failure(
-            Exit::usage,
-            "--deinterlace: the input is progressive; a raw file of fields has rate=25i or 25b in --raw");
+        throw failure(Msg::nameUnknown, {"--deinterlace", "method", deinterlace_,
+                                         suggestion(deinterlace_, known), joined(known)});
+    if (order == 0) throw failure(Msg::deinterlaceProgressive);
     if (deinterlace_ == "reverse") {
         out_.rate.setInterlaced(3 - out_.rate.interlaced());
         return;
@@ -176,11 +170,10 @@ void PictureEffects::planRate() {
     const double after = static_cast<double>(out_.rate.rate());
     const auto converts = [](double fps) { return fps > 0.1 && fps <= 120; };
     if (before == after || (converts(before) && converts(after))) return;
-    char text[120];
-    std::snprintf(text, sizeof text,
-                  "--rate: %g to %g frames a second can't be converted: each may be above 0.1, up to 120",
-                  before, after);
-    throw Failure(Exit::usage, text);
+    char from[32], to[32];
+    std::snprintf(from, sizeof from, "%g", before);
+    std::snprintf(to, sizeof to, "%g", after);
+    throw failure(Msg::rateNotConverted, {from, to});
 }
 
 void PictureEffects::planCrop() {
@@ -197,7 +190,7 @@ void PictureEffects::planMatrix(bool toPng) {
     if (text.empty()) return;
     if (toPng && options_.pixel.empty()) out_.fourcc = QvFourcc::BGR3;
     const bool yuvIn = isYuv(in_.fourcc), yuvOut = isYuv(out_.fourcc);
-    if (!yuvIn && !yuvOut) throw Failure(Exit::usage, "--matrix: neither the input nor the output is YUV");
+    if (!yuvIn && !yuvOut) throw failure(Msg::matrixNoYuv);
     if (const size_t colon = text.find(':'); colon != std::string::npos) {
         inMatrix_ = matrixNumber(std::string_view(text).substr(0, colon), text);
         outMatrix_ = matrixNumber(std::string_view(text).substr(colon + 1), text);
@@ -237,7 +230,7 @@ void PictureEffects::addFixed(FiltersState& state) const {
     set("cropBox", *crop_);
     if (cropper->getParam("outputWidth") != crop_->width() ||
         cropper->getParam("outputHeight") != crop_->height())
-        throw Failure(Exit::usage, "--crop: " + inQuotes(options_.crop) + " can't be cut from this picture");
+        throw failure(Msg::cropRefused, {options_.crop});
     state.setFilter("cropper", stateOf(*cropper));
 }
 
@@ -247,8 +240,7 @@ void PictureEffects::addOptions(FiltersState& state, long long frames, bool alon
         const AnyDict filter = filterState(spec);
         const std::string name = filter.getString("name", "");
         if ((name == "flipper" || name == "cropper" || name == "deinterlace") && state.isSet(name.c_str()))
-            throw Failure(Exit::usage,
-                          "--filter " + name + ": it has one place in the chain, which is taken");
+            throw failure(Msg::filterPlaceTaken, {name});
         append(state, filter, filter.get("_front").isTrue());
     }
     for (const auto& logo : options_.logos) append(state, logoState(logo, out_), false);
@@ -296,7 +288,13 @@ namespace {
 
 // Opens a filter for a moment. One that writes a file would make it then, so it has to wait for the run.
 void tryFilter(QvVideoFilter& filter) {
-    if (!filterFile(filter, QV_GUI_FILESELECT_SAVE).empty()) return;
+    if (const std::string written = filterFile(filter, QV_GUI_FILESELECT_SAVE); !written.empty()) {
+        // A new one has a name that stands for none.
+        const std::unique_ptr<QvCodec> fresh(qv_registry()->newCodec(filter.name()));
+        if (fresh && filterFile(*fresh, QV_GUI_FILESELECT_SAVE) == written)
+            throw failure(Msg::filterFileMissing, {filter.name()});
+        return;
+    }
     int result = QvStatus::failed;
     std::string reason;
     const MemoryWatch memory;
@@ -309,10 +307,9 @@ void tryFilter(QvVideoFilter& filter) {
     }
     if (result == QvStatus::ok) return;
     if (memory.ranOut()) throw std::bad_alloc();
-    const std::string_view name = filter.name();
-    const bool reads = !filterFile(filter, QV_GUI_FILESELECT_LOAD).empty();
-    throw Failure(reads ? Exit::input : Exit::usage,
-                  "the filter " + std::string(name) + " can't be used: " + inLine(reason));
+    const std::string read = filterFile(filter, QV_GUI_FILESELECT_LOAD);
+    if (!read.empty()) throw failure(Msg::filterFileRefused, {filter.name(), read, reason});
+    throw failure(Msg::filterRefused, {filter.name(), reason});
 }
 
 std::string textOf(const Any& value) {
@@ -396,14 +393,14 @@ void renameFilterFiles(FiltersState& filters,
 
 void checkFilterFiles(const QvVProcessPipe& pipe, const std::vector<std::string>& inputs,
                       const Outputs* outputs, const OutputPolicy& policy) {
-    const auto checkOutput = [&](const std::string& name, const char* what) {
+    const auto checkOutput = [&](const std::string& name, Msg what) {
         if (outputs && !outputs->isDevice() && samePlace(name, outputs->output()))
-            throw Failure(Exit::output, "can't write " + inQuotes(name) + ": it is also " + what);
+            throw failure(what, {name});
     };
     std::vector<std::string> read = inputs;
     for (int i = 0; i < pipe.nrFilters(); ++i)
         if (const auto name = filterFile(*pipe.filter(i), QV_GUI_FILESELECT_LOAD); !name.empty()) {
-            checkOutput(name, "an input");
+            checkOutput(name, Msg::outputIsInput);
             read.push_back(name);
         }
     for (int i = 0; i < pipe.nrFilters(); ++i) {
@@ -411,7 +408,7 @@ void checkFilterFiles(const QvVProcessPipe& pipe, const std::vector<std::string>
         const std::string name = filterFile(filter, QV_GUI_FILESELECT_SAVE);
         if (name.empty()) continue;
         const Outputs checked(name, std::string("--filter ") + filter.name(), read, policy);
-        checkOutput(name, "the output of the job");
+        checkOutput(name, Msg::outputIsOutput);
     }
 }
 
@@ -420,7 +417,7 @@ std::unique_ptr<QvVProcessPipe> tryPipe(const VideoJobDescription& job) {
     try {
         pipe.reset(QvProcessUtil::createVideoPipeAux(job, nullptr, true));
     } catch (const QvAssertFailure& failure) {
-        throw Failure(Exit::module, inLine(failure.what()));
+        throw ::failure(Msg::chainRefused, {failure.what()});
     }
     for (int i = 0; pipe && i < pipe->nrFilters(); ++i) tryFilter(*pipe->filter(i));
     return pipe;

@@ -1,11 +1,11 @@
 #include "tarsel/picture/picturereader.h"
 
-#include "tarsel/words/failure.h"
+#include "tarsel/words/messages.h"
 
 namespace {
 
-[[noreturn]] void failed(const std::string& reason) {
-    throw Failure(Exit::failed, "can't make the picture: " + inLine(reason));
+[[noreturn]] void failed(const Source& source, const std::string& reason) {
+    throw failure(Msg::pictureFailed, {source.name(), reason});
 }
 
 }  // namespace
@@ -18,8 +18,7 @@ PictureReader::PictureReader(Source& source, const EffectOptions& options)
     pipe_ = tryPipe(effects_.job(effects_.filters(frames_, true)));
     for (int i = 0; pipe_ && i < pipe_->nrFilters(); ++i)
         if (!filterFile(*pipe_->filter(i), QV_GUI_FILESELECT_SAVE).empty())
-            throw Failure(Exit::usage, std::string("--filter ") + pipe_->filter(i)->name() +
-                                           ": it writes a file, and single pictures are no run");
+            throw failure(Msg::filterWritesFile, {pipe_->filter(i)->name()});
     if (pipe_) reopen();
 }
 
@@ -29,7 +28,7 @@ PictureReader::~PictureReader() {
 
 void PictureReader::reopen() {
     pipe_->close();
-    if (pipe_->open() != QvStatus::ok) failed(pipe_->errorDesc());
+    if (pipe_->open() != QvStatus::ok) failed(source_, pipe_->errorDesc());
     for (int i = 0; i < pipe_->nrFilters(); ++i) {
         if (pipe_->filter(i)->getParam("_isFramerateConverter").isTrue()) break;
         pipe_->filter(i)->setParam("_totalFrames", static_cast<int>(inFrames_));
@@ -48,8 +47,7 @@ const QvFrame& PictureReader::at(long long number) {
 const QvFrame& PictureReader::read(long long frame) {
     QvDecodePipe& decoder = source_.decoder();
     if (decoder.seekToFrame(frame, 0) != QvStatus::ok || decoder.readFrame(0) != QvStatus::ok)
-        throw Failure(Exit::input, "can't read frame " + std::to_string(frame) + " of " +
-                                       inQuotes(source_.name()) + ": " + decoder.errorDesc());
+        throw failure(Msg::frameReadFailed, {std::to_string(frame), source_.name()});
     return *decoder.getFramePtr(0);
 }
 
@@ -58,7 +56,7 @@ const QvFrame& PictureReader::single(long long number) {
     if (holds_) pipe_->next();
     nextInput_ = number;
     holds_ = advance();
-    if (!holds_) failed("no frame came out of the filters");
+    if (!holds_) failed(source_, "no frame came out of the filters");
     return *pipe_->frame();
 }
 
@@ -67,7 +65,7 @@ const QvFrame& PictureReader::inOrder(long long number) {
     while (!holds_ || pipe_->frame()->frameNr < number) {
         if (holds_) pipe_->next();
         holds_ = advance();
-        if (!holds_) failed("no frame came out of the filters for this time");
+        if (!holds_) failed(source_, "no frame came out of the filters for this time");
     }
     return *pipe_->frame();
 }
@@ -77,7 +75,7 @@ bool PictureReader::advance() {
     for (;;) {
         const int result = pipe_->process(nullptr, 0);
         if (result == QvStatus::ok) return true;
-        if (result != QvStatus::needsInput) failed(pipe_->errorDesc());
+        if (result != QvStatus::needsInput) failed(source_, pipe_->errorDesc());
         if (nextInput_ >= inFrames_) return false;
         QvFrame& frame = const_cast<QvFrame&>(read(nextInput_++));
         if (pipe_->write(frame) != QvStatus::ok) checkFilters();
@@ -87,6 +85,5 @@ bool PictureReader::advance() {
 void PictureReader::checkFilters() const {
     for (int i = 0; i < pipe_->nrFilters(); ++i)
         if (pipe_->filter(i)->errorCode() != 0)
-            failed(std::string("the filter ") + pipe_->filter(i)->name() + ": " +
-                   pipe_->filter(i)->errorDesc());
+            throw failure(Msg::filterFailed, {pipe_->filter(i)->name(), pipe_->filter(i)->errorDesc()});
 }

@@ -4,8 +4,11 @@
 #include <cstdio>
 
 #include "tarsel/host/files.h"
-#include "tarsel/words/failure.h"
+#include "tarsel/source/captionfile.h"
+#include "tarsel/source/picturefile.h"
+#include "tarsel/source/wavformat.h"
 #include "tarsel/words/keyvalues.h"
+#include "tarsel/words/messages.h"
 #include "tarsel/words/timespec.h"
 
 namespace {
@@ -29,12 +32,30 @@ double parseAspect(const std::string& text, const std::string& option) {
 
 }  // namespace
 
-void printWarnings() {
+void requireFrame(const std::string& option, unsigned fourcc, int width, int height) {
+    QvFrame frame;
+    if (frame.init(fourcc, width, height) != QvStatus::ok)
+        throw failure(Msg::frameTooLarge, {option, std::to_string(width) + "x" + std::to_string(height)});
+}
+
+std::vector<std::string> engineWarnings() {
+    std::vector<std::string> texts;
     AnyVector messages;
     qv_log()->getAll(messages);
     for (const Any& message : messages)
-        if (message.asDict().getInt32("type") == QvLogMask::warning)
-            std::fprintf(stderr, "tarsel: warning: %s\n", message.asDict().getString("text", ""));
+        if (message.asDict().getInt32("type", 0) == QvLogMask::warning)
+            texts.emplace_back(message.asDict().getString("text", ""));
+    qv_log()->clear();
+    return texts;
+}
+
+void printWarnings() {
+    std::vector<std::string> lines;
+    for (const std::string& text : engineWarnings())
+        if (const std::string line = lineOf(Msg::engineWarns, {text});
+            std::find(lines.begin(), lines.end(), line) == lines.end())
+            lines.push_back(line);
+    for (const auto& line : lines) std::fprintf(stderr, "tarsel: warning: %s\n", line.c_str());
 }
 
 std::vector<std::string> moduleNames(int kind) {
@@ -48,12 +69,9 @@ std::vector<std::string> moduleNames(int kind) {
 std::unique_ptr<QvCodec> makeAnyCodec(const std::string& module, int kind) {
     const QvModule* found = qv_registry()->module(module.c_str());
     if (!found || found->getAttr("type").toInt32() != kind)
-        throw Failure(Exit::module, "there is no module " + inQuotes(module) + " of this kind." +
-                                        suggestion(module, moduleNames(kind)) +
-                                        " 'tarsel modules' lists all");
+        throw failure(Msg::moduleUnknown, {module, suggestion(module, moduleNames(kind))});
     std::unique_ptr<QvCodec> codec(qv_registry()->newCodec(module.c_str()));
-    if (!codec)
-        throw Failure(Exit::module, "the module " + inQuotes(module) + " can't be used in this installation");
+    if (!codec) throw failure(Msg::moduleUnusable, {module});
     return codec;
 }
 
@@ -75,13 +93,12 @@ void setChecked(QvCodec& codec, const std::string& name, const Any& value, const
     try {
         result = codec.setParam(name.c_str(), value);
     } catch (const QvParamException&) {
-        throw Failure(Exit::usage, what + ": " + codec.name() + " has no parameter " + inQuotes(name) + "." +
-                                       suggestion(name, storedNames(codec)));
+        throw failure(Msg::parameterUnknown,
+                      {what, codec.name(), name, suggestion(name, storedNames(codec))});
     }
     if (result == QvStatus::ok) return;
     const std::string reason = codec.errorDesc();
-    throw Failure(Exit::usage, what + ": " + codec.name() + " can't take this value for " + inQuotes(name) +
-                                   (reason.empty() ? "" : " (" + inLine(reason) + ")"));
+    throw failure(Msg::parameterRefused, {what, name, reason.empty() ? "it is not in its range" : reason});
 }
 
 namespace {
@@ -93,12 +110,11 @@ bool isGenerator(const std::string& spec) { return spec.rfind(kGenerator, 0) == 
 Source::Source(const std::string& spec, const std::string& raw) : name_(spec) {
     if (isGenerator(spec)) {
         isFile_ = false;
-        if (!raw.empty())
-            throw Failure(Exit::usage, "--raw describes a file; " + inQuotes(spec) + " is none");
+        if (!raw.empty()) throw failure(Msg::rawNoFile, {spec});
         openGenerator(spec);
         return;
     }
-    if (const std::string why = whyNoInput(spec); !why.empty()) refuse(why);
+    requireInput(spec);
     if (raw.empty())
         openFile();
     else
@@ -111,9 +127,7 @@ bool Source::describesItself(const std::string& spec) {
     return !qv_registry()->decoders(ext.asString()).empty();
 }
 
-void Source::refuse(const std::string& why) const {
-    throw Failure(Exit::input, "can't open " + inQuotes(name_) + ": " + inLine(why));
-}
+void Source::refuse(const std::string& why) const { throw failure(Msg::inputRefused, {name_, why}); }
 
 void Source::openGenerator(const std::string& spec) {
     const std::string option = "testgen";
@@ -125,12 +139,11 @@ void Source::openGenerator(const std::string& spec) {
         return given ? *given : std::string(otherwise);
     };
     const Size size = parseSize(value("size", "1280x720"), option + ": size");
-    if (size.width < 32 || size.height < 32)
-        throw Failure(Exit::usage, option + ": size: the test picture is at least 32x32");
+    if (size.width < 32 || size.height < 32) throw failure(Msg::generatorSmall, {value("size", "")});
+    requireFrame(option + ": size", QvFourcc::BGR4, size.width, size.height);
     const QvFramerate rate = parseRate(value("rate", "25"), option + ": rate");
     const MediaTime duration = parseTime(value("duration", "10"), rate, option + ": duration");
-    if (duration.position(rate) < 1)
-        throw Failure(Exit::usage, option + ": duration: " + value("duration", "10") + " holds no frame");
+    if (duration.position(rate) < 1) throw failure(Msg::generatorNoFrame, {value("duration", "10")});
 
     AnyDict video, audio, streams;
     video.set("width", size.width);
@@ -142,8 +155,7 @@ void Source::openGenerator(const std::string& spec) {
     if (const std::string* aspect = keys.find("aspect"))
         video.set("frameAspect", parseAspect(*aspect, option + ": aspect"));
     if (const std::string* picture = keys.find("picture")) {
-        if (!isRegularFile(*picture))
-            throw Failure(Exit::input, "can't open the picture " + inQuotes(*picture));
+        requirePicture(*picture);
         video.set("picture", picture->c_str());
     }
     audio.set("duration", Any(duration));
@@ -156,24 +168,25 @@ void Source::openGenerator(const std::string& spec) {
     decoder_ = makeCodec<QvDecodePipe>("testgen", kDecoder);
     if (const std::string* mode = keys.find("mode")) {
         if (*mode != "graybar" && *mode != "card")
-            throw Failure(Exit::usage, option + ": mode: use card or graybar");
+            throw failure(Msg::nameUnknown, {option + ": mode", "mode", *mode, "", "card or graybar"});
         decoder_->setParam("mode", mode->c_str());
     }
     decoder_->setParam("streams", streams);
-    if (decoder_->open() != QvStatus::ok) refuse(decoder_->errorDesc());
-    if (decoder_->nrStreams(1) == 0) refuse("the picture can't be used");
+    if (decoder_->open() != QvStatus::ok) throw failure(Msg::generatorFailed, {name_, decoder_->errorDesc()});
 }
 
 void Source::openRaw(const std::string& raw) {
     const std::string option = "--raw";
     const KeyValues keys(raw, kRawKeys, option);
     const std::string *size = keys.find("size"), *pixel = keys.find("pixel"), *rate = keys.find("rate");
-    if (!size || !pixel) throw Failure(Exit::usage, "--raw needs size=WIDTHxHEIGHT and pixel=FORMAT");
+    if (!size || !pixel) throw failure(Msg::rawIncomplete);
     decoder_ = makeCodec<QvDecodePipe>("rawdec", kDecoder);
     QvDecodePipe& d = *decoder_;
     const Size dimensions = parseSize(*size, option + " size");
+    const unsigned fourcc = parsePixel(*pixel, option + " pixel");
+    requireFrame(option + " size", fourcc, dimensions.width, dimensions.height);
     setChecked(d, "filename", name_.c_str(), option);
-    setChecked(d, "FOURCC", static_cast<int>(parsePixel(*pixel, option + " pixel")), option + " pixel");
+    setChecked(d, "FOURCC", static_cast<int>(fourcc), option + " pixel");
     setChecked(d, "width", dimensions.width, option + " size");
     setChecked(d, "height", dimensions.height, option + " size");
     setChecked(d, "framerate", Any(parseRate(rate ? *rate : "25", option + " rate")), option + " rate");
@@ -191,7 +204,7 @@ void Source::openRaw(const std::string& raw) {
     if (const auto* aspect = keys.find("aspect"))
         setChecked(d, "frameAspect", parseAspect(*aspect, option + " aspect"), option + " aspect");
     if (d.open() != QvStatus::ok) refuse(d.errorDesc());
-    if (d.nrFrames(0) == 0) refuse("the file is shorter than one frame of " + *size + " " + *pixel);
+    if (d.nrFrames(0) == 0) throw failure(Msg::rawTooShort, {name_, *size, *pixel});
 }
 
 namespace {
@@ -207,13 +220,17 @@ Any captionParameters() { return AnyDict("dropFrameLines", 1); }
 }  // namespace
 
 // Why the best decoder refuses the file. The factory keeps only its name, so it is asked once more.
-std::string Source::reasonOf(const AnyVector& decoders) const {
-    std::unique_ptr<QvCodec> codec(qv_registry()->newCodec(decoders.at(0).asString()));
-    if (!codec) return std::string("the decoder ") + decoders.at(0).asString() + " can't be used";
+void Source::refuseFile(const std::string& decoder) const {
+    const std::unique_ptr<QvCodec> codec(qv_registry()->newCodec(decoder.c_str()));
+    if (!codec) throw failure(Msg::inputNoDecoder, {name_});
     if (isCaptionFile(name_)) codec->setParam("openParameters", captionParameters());
     codec->setParam("filename", name_.c_str());
-    if (codec->open() == QvStatus::ok || !*codec->errorDesc()) return "no decoder can read it";
-    return codec->errorDesc();
+    const bool opens = codec->open() == QvStatus::ok;
+    if (decoder == "wavdec") refuseWav(name_);
+    if (decoder == "sccdec") refuseScc(name_);
+    const Any ext = QvFile::getExt(Any(name_.c_str()), true);
+    if (ext == "srt" || ext == "sub") throw failure(Msg::inputNoSubtitles, {name_});
+    refuse(opens || !*codec->errorDesc() ? "no decoder can read it" : codec->errorDesc());
 }
 
 void Source::openFile() {
@@ -225,14 +242,11 @@ void Source::openFile() {
     const AnyVector candidates = qv_registry()->decoders(ext.asString());
     const std::unique_ptr<AnyVector> exts(qv_registry()->inputExts(false, false));
     if (candidates.empty()) {
-        std::vector<std::string> known;
-        for (int i = 0; i < exts->size(); ++i) known.push_back(exts->at(i).asString());
-        if (std::find(known.begin(), known.end(), ext.asString()) != known.end())
-            refuse("a raw file has no header; give its format with --raw size=WxH,pixel=FORMAT,rate=R");
-        refuse("no decoder for the extension " + inQuotes(ext.asString()) +
-               "; 'tarsel formats' lists what opens");
+        for (int i = 0; i < exts->size(); ++i)
+            if (exts->at(i) == ext) throw failure(Msg::inputIsRaw, {name_});
+        throw failure(Msg::inputUnknown, {name_, ext.asString()});
     }
-    refuse(reasonOf(candidates));
+    refuseFile(candidates.at(0).asString());
 }
 
 long long Source::bytes() const { return isFile_ ? fileBytes(name_) : -1; }
@@ -261,8 +275,7 @@ void Source::selectAll() {
     for (int type : {1, 2})
         for (int i = 0; i < decoder_->nrStreams(type); ++i)
             if (decoder_->select(type, i) != QvStatus::ok)
-                refuse(std::string(type == 1 ? "video" : "audio") + " stream " + std::to_string(i) +
-                       " can't be read");
+                throw failure(Msg::streamRefused, {name_, type == 1 ? "video" : "audio", std::to_string(i)});
 }
 
 std::string Source::damage() const {

@@ -38,7 +38,7 @@ class Source {
     void openGenerator(const std::string& spec);
     void openRaw(const std::string& raw);
     void openFile();
-    std::string reasonOf(const AnyVector& decoders) const;
+    [[noreturn]] void refuseFile(const std::string& decoder) const;
     [[noreturn]] void refuse(const std::string& why) const;
 
     std::string name_;
@@ -50,7 +50,12 @@ class Source {
 // or a value it can't take.
 void setChecked(QvCodec& codec, const std::string& name, const Any& value, const std::string& what);
 
-// What the decoders warned of so far, as that a rate is a guess, on the standard error.
+// Throws Failure (usage) with `option` in the line if no frame of this format can be had.
+void requireFrame(const std::string& option, unsigned fourcc, int width, int height);
+
+// What the engine warned of since the last call, as that a rate is a guess.
+std::vector<std::string> engineWarnings();
+// The same on the standard error, each line once.
 void printWarnings();
 
 // The names of all modules of a kind.

@@ -1,11 +1,12 @@
 #include "tarsel/words/commandline.h"
 
 #include <algorithm>
+#include <span>
 #include <sstream>
 
 #include <CLI/CLI.hpp>
 
-#include "tarsel/words/failure.h"
+#include "tarsel/words/messages.h"
 
 namespace {
 
@@ -15,55 +16,136 @@ std::vector<std::string> commandNames(const CLI::App& app) {
     return names;
 }
 
-// The parser's words for what was given too much.
-std::string unexpected(const CLI::App& used, const std::vector<std::string>& known) {
-    const std::vector<std::string> words = used.remaining(true);
-    if (words.empty()) return "there is a word too many";
-    const std::string word = words.front().substr(0, words.front().find('='));
-    const bool option = word.size() > 1 && word[0] == '-';
-    return std::string("unknown ") + (option ? "option " : "argument ") + inQuotes(word) + "." +
-           suggestion(word, known);
+std::string helpOf(const CLI::App& app) {
+    return app.get_parent() ? "tarsel " + app.get_name() + " --help" : "tarsel --help";
 }
 
-// Wrong use: what the parser says, with near matches for an unknown option.
+// "-o,--output" as "--output".
+std::string nameOf(const CLI::Option& option) {
+    if (!option.get_lnames().empty()) return "--" + option.get_lnames().front();
+    return option.get_positional() ? option.get_name(true) : "-" + option.get_snames().front();
+}
+
+// What the parser could not place.
+[[noreturn]] void unexpected(const CLI::App& used) {
+    const std::vector<std::string> words = used.remaining(true);
+    const std::string word = words.empty() ? "" : words.front().substr(0, words.front().find('='));
+    if (word.size() < 2 || word[0] != '-') throw failure(Msg::wordTooMany, {word, helpOf(used)});
+    std::vector<std::string> known;
+    for (const CLI::Option* option : used.get_options())
+        for (const auto& name : option->get_lnames()) known.push_back("--" + name);
+    throw failure(Msg::optionUnknown, {word, suggestion(word, known), helpOf(used)});
+}
+
+// Wrong use, which the parser reports in words of its own.
 [[noreturn]] void wrongUse(const CLI::App& app, const CLI::ParseError& error) {
     const CLI::App* used = &app;
     for (const CLI::App* sub : app.get_subcommands()) used = sub;
-    std::vector<std::string> known = used == &app ? commandNames(app) : std::vector<std::string>();
+    // A mistyped option may be why another one is missing.
+    if (dynamic_cast<const CLI::ExtrasError*>(&error) || (used != &app && used->remaining_size() > 0))
+        unexpected(*used);
+    if (used == &app && app.get_subcommands().empty()) throw failure(Msg::commandMissing);
     for (const CLI::Option* option : used->get_options())
-        for (const auto& name : option->get_lnames()) known.push_back("--" + name);
-    std::string line;
-    if (dynamic_cast<const CLI::ExtrasError*>(&error))
-        line = unexpected(*used, known);
-    else if (used == &app)
-        line = "give a command.";
-    else
-        line = inLine(error.what()) + ".";
-    const std::string help = used == &app ? "tarsel --help" : "tarsel " + used->get_name() + " --help";
-    throw Failure(Exit::usage, line + " See '" + help + "'");
+        if (option->get_required() && option->count() == 0)
+            throw failure(Msg::argumentMissing, {nameOf(*option), helpOf(*used)});
+    throw failure(Msg::commandLineWrong, {helpOf(*used)});
 }
 
-// The parser takes a mistyped command for a missing one.
-void checkCommand(const CLI::App& app, int argc, char** argv) {
-    const std::vector<std::string> known = commandNames(app);
-    const auto takesValue = [&](const std::string& word) {
-        const CLI::Option* option =
-            word.find('=') == std::string::npos ? app.get_option_no_throw(word) : nullptr;
-        return option && option->get_expected_max() > 0;
-    };
-    for (int i = 1; i < argc; ++i) {
-        const std::string word = argv[i];
-        if (word.empty()) continue;
-        if (word[0] == '-') {
-            if (takesValue(word)) ++i;
-            continue;
+// Reads the words as the parser will, for what it would accept or could not name: a value on a flag, an
+// option without its value, one that is given twice.
+class WordCheck {
+  public:
+    WordCheck(const CLI::App& app, const std::vector<CommandLine::Taken>& options)
+        : app_(&app), options_(options) {}
+
+    void run(std::span<char*> words) {
+        words_ = words;
+        for (at_ = 0; at_ < words_.size(); ++at_) {
+            const std::string word = words_[at_];
+            if (word == "--") return;
+            if (word.rfind("--", 0) == 0)
+                longOption(word);
+            else if (word.size() > 1 && word[0] == '-')
+                shortOptions(word);
+            else if (!app_->get_parent() && !word.empty())
+                enter(word);
         }
-        if (std::find(known.begin(), known.end(), word) == known.end())
-            throw Failure(Exit::usage, "there is no command " + inQuotes(word) + "." +
-                                           suggestion(word, known) + " 'tarsel --help' lists all");
-        return;
     }
-}
+
+  private:
+    // The parser takes a mistyped command for a missing one.
+    void enter(const std::string& word) {
+        const auto named = [&](const CLI::App* sub) { return sub->get_name() == word; };
+        const auto commands = app_->get_subcommands(named);
+        if (commands.empty())
+            throw failure(Msg::commandUnknown, {word, suggestion(word, commandNames(*app_))});
+        app_ = commands.front();
+    }
+
+    const CommandLine::Taken* find(const std::string& name) const {
+        const CLI::Option* option = app_->get_option_no_throw(name);
+        const auto found = std::find_if(options_.begin(), options_.end(),
+                                        [&](const auto& row) { return row.option == option; });
+        return option && found != options_.end() ? &*found : nullptr;
+    }
+
+    void longOption(const std::string& word) {
+        const size_t equals = std::min(word.find('='), word.size());
+        const CommandLine::Taken* row = find(word.substr(0, equals));
+        if (!row) return;
+        const bool given = equals < word.size();
+        const std::string value = given ? word.substr(equals + 1) : "";
+        if (row->kind == CommandLine::Kind::flag) {
+            if (given) throw failure(Msg::valueNotTaken, {nameOf(*row->option), value});
+        } else if (row->kind != CommandLine::Kind::flagOrValue) {
+            take(*row, given ? value : next());
+        } else {
+            if (given) needValue(*row, value);
+            count(*row);
+        }
+    }
+
+    // "-qy", "-o FILE" and "-oFILE".
+    void shortOptions(const std::string& word) {
+        for (size_t i = 1; i < word.size(); ++i) {
+            const CommandLine::Taken* row = find(std::string("-") + word[i]);
+            if (!row) return;
+            if (row->kind == CommandLine::Kind::flag) continue;
+            return take(*row, i + 1 < word.size() ? word.substr(i + 1) : next());
+        }
+    }
+
+    std::string next() { return at_ + 1 < words_.size() ? words_[++at_] : ""; }
+
+    void take(const CommandLine::Taken& row, const std::string& value) {
+        needValue(row, value);
+        count(row);
+        if (!row.values.empty() && std::find(row.values.begin(), row.values.end(), value) == row.values.end())
+            throw failure(Msg::choiceUnknown,
+                          {nameOf(*row.option), value, suggestion(value, row.values), joined(row.values)});
+    }
+
+    static void needValue(const CommandLine::Taken& row, const std::string& value) {
+        if (!value.empty()) return;
+        const std::string name = nameOf(*row.option), type = row.option->get_type_name();
+        // The type of an option that can do without a value is "[=TYPE]".
+        const bool optional = row.kind == CommandLine::Kind::flagOrValue;
+        throw failure(Msg::valueMissing,
+                      {name, name + "=" + (optional ? type.substr(2, type.size() - 3) : type)});
+    }
+
+    void count(const CommandLine::Taken& row) {
+        if (std::find(seen_.begin(), seen_.end(), &row) != seen_.end())
+            throw failure(Msg::optionRepeated, {nameOf(*row.option)});
+        if (row.kind != CommandLine::Kind::list) seen_.push_back(&row);
+    }
+
+    const CLI::App* app_;
+    const std::vector<CommandLine::Taken>& options_;
+    std::span<char*> words_;
+    size_t at_ = 0;
+    std::vector<const CommandLine::Taken*> seen_;
+};
 
 }  // namespace
 
@@ -76,33 +158,37 @@ void Command::arguments(const char* name, std::vector<std::string>& to, const ch
     if (most > 0) words->expected(1, most);
 }
 
+void Command::take(CLI::Option* option, CommandLine::Kind kind, const std::vector<std::string>& values) {
+    if (!group_.empty()) option->group(group_);
+    line_.taken_.push_back({option, kind, values});
+}
+
 void Command::option(const char* names, std::string& to, const char* help, const char* type, Need need) {
     CLI::Option* option = app_.add_option(names, to, help)->type_name(type)->required(need == Need::required);
-    if (!group_.empty()) option->group(group_);
+    take(option, CommandLine::Kind::value);
 }
 
 void Command::list(const char* names, std::vector<std::string>& to, const char* help, const char* type) {
     CLI::Option* option = app_.add_option(names, to, help)->type_name(type)->allow_extra_args(false);
-    if (!group_.empty()) option->group(group_);
+    take(option, CommandLine::Kind::list);
 }
 
 void Command::choice(const char* names, std::string& to, const char* help,
                      const std::vector<std::string>& values) {
-    app_.add_option(names, to, help)->check(CLI::IsMember(values));
+    CLI::Option* option = app_.add_option(names, to, help)->type_name(joined(values, "|"));
+    take(option, CommandLine::Kind::value, values);
 }
 
 void Command::flag(const char* names, bool& to, const char* help) {
-    CLI::Option* option = app_.add_flag(names, to, help);
-    if (!group_.empty()) option->group(group_);
+    take(app_.add_flag(names, to, help), CommandLine::Kind::flag);
 }
 
 void Command::flagOrValue(const char* names, std::string& to, const char* help, const char* type) {
-    CLI::Option* option = app_.add_flag(names, to, help)->type_name(type);
-    if (!group_.empty()) option->group(group_);
+    take(app_.add_flag(names, to, help)->type_name(type), CommandLine::Kind::flagOrValue);
 }
 
 void Command::action(std::function<void()> run) {
-    app_.callback([chosen = chosen_, run = std::move(run)] { *chosen = run; });
+    app_.callback([chosen = &line_.chosen_, run = std::move(run)] { *chosen = run; });
 }
 
 CommandLine::CommandLine(const char* description, const std::string& version)
@@ -117,18 +203,19 @@ void CommandLine::option(const char* names, std::string& to, const char* help, c
                          const char* variable) {
     CLI::Option* option = app_->add_option(names, to, help)->type_name(type);
     if (variable) option->envname(variable);
+    taken_.push_back({option, Kind::value, {}});
 }
 
-void CommandLine::flag(const char* names, bool& to, const char* help) { app_->add_flag(names, to, help); }
+void CommandLine::flag(const char* names, bool& to, const char* help) {
+    taken_.push_back({app_->add_flag(names, to, help), Kind::flag, {}});
+}
 
 Command CommandLine::command(const char* name, const char* help) {
-    Command made(*app_->add_subcommand(name, help));
-    made.chosen_ = &chosen_;
-    return made;
+    return Command(*app_->add_subcommand(name, help), *this);
 }
 
 CommandLine::Parsed CommandLine::parse(int argc, char** argv) {
-    checkCommand(*app_, argc, argv);
+    WordCheck(*app_, taken_).run({argv + 1, argv + std::max(argc, 1)});
     try {
         app_->parse(argc, argv);
     } catch (const CLI::Success& shown) {

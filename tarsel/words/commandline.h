@@ -10,16 +10,53 @@
 
 namespace CLI {
 class App;
-}
+class Option;
+}  // namespace CLI
 
 enum class Need { optional, required };
 
+class Command;
+
+class CommandLine {
+  public:
+    CommandLine(const char* description, const std::string& version);
+    ~CommandLine();
+    CommandLine(const CommandLine&) = delete;
+    CommandLine& operator=(const CommandLine&) = delete;
+
+    // Of the tool itself, before the command; `variable` is the environment's, or null.
+    void option(const char* names, std::string& to, const char* help, const char* type, const char* variable);
+    void flag(const char* names, bool& to, const char* help);
+    Command command(const char* name, const char* help);
+
+    enum class Kind { value, list, flag, flagOrValue };
+    // An option as it was described.
+    struct Taken {
+        const CLI::Option* option;
+        Kind kind;
+        std::vector<std::string> values;  // the only ones that it takes; empty for any
+    };
+
+    struct Parsed {
+        std::string text;              // help or version, when these were asked for
+        std::function<void()> action;  // of the command otherwise
+    };
+    // Throws Failure (usage), with near matches for an unknown name; also for a flag with a value, an option
+    // without one, and an option other than a list or a flag that is given twice.
+    Parsed parse(int argc, char** argv);
+
+  private:
+    std::unique_ptr<CLI::App> app_;
+    friend class Command;
+    std::vector<Taken> taken_;
+    std::function<void()> chosen_;
+};
+
 // One command as it is described. What is given goes into the targets, which live until the command has run.
-// Names are
-// "-o,--output"; `type` is what the help shows for the value.
+// Names are "-o,--output"; `type` is what the help shows for the value.
 class Command {
   public:
-    explicit Command(CLI::App& app) : app_(app) {}
+    Command(CLI::App& app, CommandLine& line) : app_(app), line_(line) {}
 
     // The words that are no options: one, or up to `most` of them, and at least one.
     void argument(const char* name, std::string& to, const char* help);
@@ -41,32 +78,9 @@ class Command {
     void action(std::function<void()> run);
 
   private:
-    friend class CommandLine;
+    void take(CLI::Option* option, CommandLine::Kind kind, const std::vector<std::string>& values = {});
+
     CLI::App& app_;
+    CommandLine& line_;
     std::string group_;
-    std::function<void()>* chosen_ = nullptr;
-};
-
-class CommandLine {
-  public:
-    CommandLine(const char* description, const std::string& version);
-    ~CommandLine();
-    CommandLine(const CommandLine&) = delete;
-    CommandLine& operator=(const CommandLine&) = delete;
-
-    // Of the tool itself, before the command; `variable` is the environment's, or null.
-    void option(const char* names, std::string& to, const char* help, const char* type, const char* variable);
-    void flag(const char* names, bool& to, const char* help);
-    Command command(const char* name, const char* help);
-
-    struct Parsed {
-        std::string text;              // help or version, when these were asked for
-        std::function<void()> action;  // of the command otherwise
-    };
-    // Throws Failure (usage), with near matches for an unknown name.
-    Parsed parse(int argc, char** argv);
-
-  private:
-    std::unique_ptr<CLI::App> app_;
-    std::function<void()> chosen_;
 };

@@ -38,6 +38,15 @@ std::string suggestion(std::string_view unknown, const std::vector<std::string>&
     return text + "?";
 }
 
+std::string joined(const std::vector<std::string>& words, std::string_view separator) {
+    std::string text;
+    for (const auto& word : words) {
+        if (!text.empty()) text += separator;
+        text += word;
+    }
+    return text;
+}
+
 std::string inLine(std::string text) {
     std::replace(text.begin(), text.end(), '\n', ' ');
     // A log line's "[part of the engine] ".

@@ -31,6 +31,9 @@ class Failure : public std::runtime_error {
 // " Did you mean 'a' or 'b'?" for an unknown name with near matches among the known ones, else "".
 std::string suggestion(std::string_view unknown, const std::vector<std::string>& known);
 
+// "a, b, c", or with another separator "a|b|c".
+std::string joined(const std::vector<std::string>& words, std::string_view separator = ", ");
+
 // What the engine or the system said, as the rest of a line: it begins with a small letter unless with a name
 // or an abbreviation, and stays on the line.
 std::string inLine(std::string text);

@@ -2,7 +2,7 @@
 
 #include <algorithm>
 
-#include "tarsel/words/failure.h"
+#include "tarsel/words/messages.h"
 
 namespace {
 
@@ -26,19 +26,17 @@ KeyValues::KeyValues(std::string_view text, const std::vector<std::string>& know
     while (!text.empty()) {
         const std::string pair = takePart(text);
         const size_t equals = pair.find('=');
-        if (equals == std::string::npos || equals == 0)
-            throw Failure(Exit::usage,
-                          std::string(option) + ": " + inQuotes(pair) + " is not of the form key=value");
+        if (equals == std::string::npos || equals == 0) throw failure(Msg::keyNotPair, {option, pair});
         const std::string key = pair.substr(0, equals);
         if (!known.empty() && std::find(known.begin(), known.end(), key) == known.end())
-            throw Failure(Exit::usage, std::string(option) + ": unknown key " + inQuotes(key) + "." +
-                                           suggestion(key, known));
+            throw failure(Msg::keyUnknown, {option, key, suggestion(key, known), joined(known)});
+        if (find(key)) throw failure(Msg::keyRepeated, {option, key});
         pairs_.emplace_back(key, pair.substr(equals + 1));
     }
 }
 
 const std::string* KeyValues::find(std::string_view key) const {
-    for (auto pair = pairs_.rbegin(); pair != pairs_.rend(); ++pair)
-        if (pair->first == key) return &pair->second;
+    for (const auto& pair : pairs_)
+        if (pair.first == key) return &pair.second;
     return nullptr;
 }

@@ -9,11 +9,11 @@
 
 class KeyValues {
   public:
-    // Throws Failure (usage), with `option` in the line, for a pair without "=" or a key that is not among
-    // `known` (any key when that is empty).
+    // Throws Failure (usage), with `option` in the line, for a pair without "=", a key that is not among
+    // `known` (any key when that is empty), or one that is given twice.
     KeyValues(std::string_view text, const std::vector<std::string>& known, std::string_view option);
 
-    // The value of a key, or null. The last of equal keys counts.
+    // The value of a key, or null.
     const std::string* find(std::string_view key) const;
     const std::vector<std::pair<std::string, std::string>>& all() const { return pairs_; }
 

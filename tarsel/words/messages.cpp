@@ -3,10 +3,131 @@
 #include <cassert>
 #include <iterator>
 
+#include "tarsel/words/systemcause.h"
+
 namespace {
 
 // clang-format off
 constexpr Message kMessages[] = {
+    // the command line
+    {Msg::commandMissing,   Exit::usage, "no command",                     "there is nothing to do",                                   "'tarsel --help' lists all commands"},
+    {Msg::commandUnknown,   Exit::usage, "there is no command {name}",     "tarsel has no such command",                               "{hint}'tarsel --help' lists all"},
+    {Msg::optionUnknown,    Exit::usage, "unknown option {name}",          "the command has none of this name",                        "{hint}see '{text}'"},
+    {Msg::wordTooMany,      Exit::usage, "unknown argument {name}",        "the command takes no further one",                         "see '{text}'"},
+    {Msg::argumentMissing,  Exit::usage, "{option} is missing",            "the command needs it",                                     "see '{text}'"},
+    {Msg::valueMissing,     Exit::usage, "{option}",                       "it needs a value",                                         "give {text}"},
+    {Msg::valueNotTaken,    Exit::usage, "{option}",                       "it takes no value, but has {name}",                        "leave out the value"},
+    {Msg::optionRepeated,   Exit::usage, "{option}",                       "it is given twice, and only one value counts",             "leave one out"},
+    {Msg::choiceUnknown,    Exit::usage, "{option}",                       "{name} is none of its values",                             "{hint}use {text}"},
+    {Msg::commandLineWrong, Exit::usage, "the command line can't be read", "no option explains a part of it",                          "see '{text}'"},
+    {Msg::keyNotPair,       Exit::usage, "{option}",                       "{name} is not of the form key=value",                      "write key=value,key=value"},
+    {Msg::keyUnknown,       Exit::usage, "{option}",                       "unknown key {name}",                                       "{hint}the keys are {text}"},
+    {Msg::keyRepeated,      Exit::usage, "{option}",                       "the key {name} is given twice, and only one value counts", "leave one out"},
+    // values of options
+    {Msg::timeWrong,        Exit::usage, "{option}", "{name} is not a time",                                  "use SS[.mmm], MM:SS, HH:MM:SS[.mmm], 120f, HH:MM:SS:FF or HH:MM:SS;FF"},
+    {Msg::timeCountsFrames, Exit::usage, "{option}", "{name} counts frames, but the input has no frame rate", "give seconds"},
+    {Msg::rateWrong,        Exit::usage, "{option}", "{name} is not a frame rate",                            "use 25, 29.97, 30000/1001, or 25i and 25b for fields"},
+    {Msg::sizeWrong,        Exit::usage, "{option}", "{name} is not a size",                                  "use WIDTHxHEIGHT such as 1280x720, each from 1 to 65535"},
+    {Msg::sheetWrong,       Exit::usage, "{option}", "{name} is not a sheet of pictures",                     "use COLUMNSxROWS from 1x1 to 32x32"},
+    {Msg::wholeWrong,       Exit::usage, "{option}", "{name} can't be used",                                  "give a whole number from {text} to {text}"},
+    {Msg::decimalWrong,     Exit::usage, "{option}", "{name} can't be used",                                  "give a number from {text} to {text}"},
+    {Msg::bitsWrong,        Exit::usage, "{option}", "{name} bits a sample can't be written",                 "use 8, 16 or 24"},
+    {Msg::pixelUnknown,     Exit::usage, "{option}", "there is no pixel format {name}",                       "{hint}'tarsel formats' lists all"},
+    {Msg::colourWrong,      Exit::usage, "{option}", "{name} is not a colour",                                "use RRGGBB in hexadecimal digits, or a name such as yellow"},
+    {Msg::encodingUnknown,  Exit::usage, "{option}", "there is no encoding {name}",                           "{hint}use a name such as utf-8 or windows-1252"},
+    {Msg::nameUnknown,      Exit::usage, "{option}", "there is no {text} {name}",                             "{hint}use {text}"},
+    {Msg::pairIncomplete,   Exit::usage, "{option}", "{text} and {text} go together",                         "give both or none"},
+    // inputs
+    {Msg::inputAbsent,       Exit::input, "can't open {file}",                      "no such file",                                          "check the name"},
+    {Msg::inputIsFolder,     Exit::input, "can't open {file}",                      "this is a folder",                                      "give the name of a file in it"},
+    {Msg::inputNotRegular,   Exit::input, "can't open {file}",                      "this is no regular file",                               "copy it into a file first"},
+    {Msg::inputEmpty,        Exit::input, "can't open {file}",                      "the file is empty",                                     "copy or make it again"},
+    {Msg::inputSystem,       Exit::input, "can't open {file}",                      "{text}",                                                "{text}"},
+    {Msg::inputUnknown,      Exit::input, "can't open {file}",                      "no decoder for the extension {name}",                   "'tarsel formats' lists what opens"},
+    {Msg::inputIsRaw,        Exit::input, "can't open {file}",                      "a raw file has no header",                              "give its format with --raw size=WxH,pixel=FORMAT,rate=R"},
+    {Msg::inputNoDecoder,    Exit::input, "can't open {file}",                      "this installation can't use the decoder of such files", "'tarsel modules' lists all"},
+    {Msg::inputRefused,      Exit::input, "can't open {file}",                      "{system}",                                              "check that the file is whole and named for what it holds"},
+    {Msg::inputFormat,       Exit::input, "can't open {file}",                      "it holds {text}",                                       "only {text} can be read; convert it first"},
+    {Msg::inputNotWav,       Exit::input, "can't open {file}",                      "this is no WAV file",                                   "check where it comes from"},
+    {Msg::inputWavDamaged,   Exit::input, "can't open {file}",                      "it is a damaged WAV file without a format",             "copy or make it again"},
+    {Msg::inputWavNoData,    Exit::input, "can't open {file}",                      "it is a damaged WAV file without usable sound data",    "copy or make it again"},
+    {Msg::inputNoScc,        Exit::input, "can't open {file}",                      "this is no SCC file",                                   "its first line has to be Scenarist_SCC V1.0"},
+    {Msg::inputNoCaptions,   Exit::input, "can't open {file}",                      "it has no caption lines",                               "check how it was made"},
+    {Msg::inputNoSubtitles,  Exit::input, "can't open {file}",                      "this is no subtitle file",                              "check that it holds .srt or .sub text"},
+    {Msg::rawNoFile,         Exit::usage, "--raw",                                  "it describes a raw file, and {name} is none",           "leave it out"},
+    {Msg::rawNoInput,        Exit::usage, "--raw",                                  "it describes a raw file, and no input is one",          "leave it out"},
+    {Msg::rawIncomplete,     Exit::usage, "--raw",                                  "size and pixel are not both there",                     "give size=WIDTHxHEIGHT,pixel=FORMAT"},
+    {Msg::rawTooShort,       Exit::input, "can't open {file}",                      "it is shorter than one frame of {text} {text}",         "check size and pixel of --raw"},
+    {Msg::streamRefused,     Exit::input, "can't read {file}",                      "its {text} stream {text} can't be decoded",             "'tarsel info' shows its streams"},
+    {Msg::inputDamaged,      Exit::input, "{file} is damaged",                      "{text}",                                                "--accept-partial takes what is there"},
+    {Msg::taskDamaged,       Exit::input, "{file} is no sound task",                "line {text}, {text}: {system}",                         "correct it, or save it again with --save-task"},
+    {Msg::taskRefused,       Exit::input, "{file} is no sound task",                "{system}",                                              "correct it, or save it again with --save-task"},
+    {Msg::fileDamaged,       Exit::input, "{file} is damaged",                      "{text}",                                                "copy or make it again"},
+    {Msg::inputEndedEarly,   Exit::input, "{file} ended early",                     "{text} of {text} {text} were read",                     "--accept-partial keeps what is there"},
+    {Msg::inputDamagedTaken, Exit::done,  "{file} is damaged",                      "{text}",                                                "taken is what is there"},
+    {Msg::inputPartlyRead,   Exit::done,  "{file} ended early",                     "{text} of {text} {text} were read",                     "kept is what is there"},
+    {Msg::readFailed,        Exit::input, "can't read {file}",                      "its data has changed or can't be reached",              "check the file and its disk"},
+    {Msg::frameReadFailed,   Exit::input, "can't read frame {text} of {file}",      "its data has changed or can't be reached",              "check the file and its disk"},
+    {Msg::inputNoPicture,    Exit::input, "no input has a picture for {file}",      "there is nothing but sound",                            "write sound alone as .wav"},
+    {Msg::inputNoSound,      Exit::input, "no input has sound for {file}",          "a .wav file holds sound only",                          "add an input that has sound, or write another format"},
+    {Msg::inputNoStreams,    Exit::input, "no input has a picture or sound",        "there is nothing to write into {file}",                 "'tarsel info' shows what an input holds"},
+    {Msg::fileNoPicture,     Exit::input, "{file} has no picture",                  "there is nothing to show",                              "'tarsel info' shows what it holds"},
+    {Msg::inputMissing,      Exit::usage, "no input",                               "there is nothing to read",                              "give a file or testgen:..."},
+    {Msg::inputUnused,       Exit::done,  "nothing of {file} goes into the output", "the output has no place for its streams",               ""},
+    {Msg::generatorSmall,    Exit::usage, "testgen: size",                          "the test picture is at least 32x32, not {text}",        "give a larger size"},
+    {Msg::generatorNoFrame,  Exit::usage, "testgen: duration",                      "{text} holds no frame",                                 "give a longer duration"},
+    {Msg::generatorFailed,   Exit::input, "can't make the test picture {name}",     "{system}",                                              "see 'tarsel transcode --help' for its keys"},
+    {Msg::pictureNoPng,      Exit::input, "can't read the picture {file}",          "it is no PNG file",                                     "give a PNG picture"},
+    {Msg::pictureDamaged,    Exit::input, "can't read the picture {file}",          "the file is damaged",                                   "copy or make it again"},
+    // parts of the input
+    {Msg::toNotAfter,     Exit::usage, "--to {text}",                 "it is not after {text}",                      "give a later --to"},
+    {Msg::fromAfterEnd,   Exit::usage, "--from {text}",               "it is after the end of {file} ({text})",      "give an earlier time"},
+    {Msg::atAfterEnd,     Exit::usage, "--at {text}",                 "it is after the end of {file} ({text})",      "give an earlier time"},
+    {Msg::toAfterEnd,     Exit::done,  "--to {text}",                 "it is after the end of {file} ({text})",      "stopped at the end"},
+    {Msg::noFrameBetween, Exit::usage, "can't take a part of {file}", "there is no frame between {text} and {text}", "move --from or --to"},
+    // pictures
+    {Msg::matrixWrong,            Exit::usage,  "--matrix",                         "{name} is not 601, 709, or IN:OUT of these",                    "use 601, 709 or 601:709"},
+    {Msg::matrixNoYuv,            Exit::usage,  "--matrix",                         "neither the input nor the output is YUV",                       "leave it out, or choose a YUV format with --pixel"},
+    {Msg::cropWrong,              Exit::usage,  "{option}",                         "{name} is not a part of a picture",                             "use WxH, WxH+X+Y or W:H"},
+    {Msg::cropEmpty,              Exit::usage,  "--crop",                           "{name} leaves less than 4x4 pixels",                            "give a larger part"},
+    {Msg::cropBeyond,             Exit::usage,  "--crop",                           "{name} is beyond the picture, which is {text}",                 "give a part of it"},
+    {Msg::cropColumns,            Exit::usage,  "--crop",                           "{name} cuts between pixels that belong together",               "use an even width and X"},
+    {Msg::cropRows,               Exit::usage,  "--crop",                           "{name} cuts between lines that belong together",                "use an even height, and a Y that is a multiple of {text}"},
+    {Msg::cropRefused,            Exit::usage,  "--crop",                           "{name} can't be cut from this picture",                         "give another part"},
+    {Msg::deinterlaceProgressive, Exit::usage,  "--deinterlace",                    "the input is progressive",                                      "for fields in a raw file give rate=25i or 25b in --raw"},
+    {Msg::rateNotConverted,       Exit::usage,  "--rate",                           "{text} to {text} frames a second can't be converted",           "each may be above 0.1 and up to 120"},
+    {Msg::styleAlone,             Exit::usage,  "--subtitle-style",                 "there are no subtitles",                                        "give them with --subtitles FILE"},
+    {Msg::placeWrong,             Exit::usage,  "--logo {name}",                    "{name} is no place",                                            "use FILE@X,Y or FILE@X,Y,OPACITY with an opacity from 0 to 1"},
+    {Msg::logoNoFile,             Exit::usage,  "--logo {name}",                    "it names no file",                                              "use FILE@X,Y"},
+    {Msg::logoBeyond,             Exit::usage,  "--logo {name}",                    "it is beyond the picture, which is {text}",                     "give a place in the picture"},
+    {Msg::logoNoPicture,          Exit::input,  "--logo: can't use {file}",         "it holds no picture that can be read",                          "give a PNG or a file with moving pictures"},
+    {Msg::subtitlesNone,          Exit::input,  "--subtitles: can't use {file}",    "there are no subtitles in it",                                  "check that it is a subtitle file (.srt or .sub)"},
+    {Msg::fontWrong,              Exit::input,  "{option}: can't use {file}",       "it is no font",                                                 "give a TrueType or OpenType font"},
+    {Msg::dropFrameNone,          Exit::usage,  "{option}",                         "{name} is drop frame, which {text} frames a second don't have", "use ':' in place of ';'"},
+    {Msg::frameTooLarge,          Exit::usage,  "{option}",                         "a frame of {text} is too large for the memory, or above 2 GiB", "give a smaller size"},
+    {Msg::sheetFailed,            Exit::failed, "--sheet",                          "a picture can't be scaled: {system}",                           "give another sheet"},
+    {Msg::pictureName,            Exit::usage,  "-o {file}",                        "a picture is a .png file",                                      "give a name that ends in .png"},
+    {Msg::pictureFailed,          Exit::failed, "can't make the picture of {file}", "{system}",                                                      "see the log: tarsel --log stderr frame ..."},
+    // filters and modules
+    {Msg::filterUnknown,     Exit::module, "--filter",                               "there is no filter {name}",                             "{hint}'tarsel modules' lists all"},
+    {Msg::filterNoStream,    Exit::usage,  "--filter {text}",                        "this job has no {text}",                                "leave it out"},
+    {Msg::effectNoPicture,   Exit::usage,  "{option}",                               "this job has no picture",                               "leave it out"},
+    {Msg::filterPlaceTaken,  Exit::usage,  "--filter {text}",                        "its one place in the chain is taken by another option", "leave one out"},
+    {Msg::filterFileMissing, Exit::usage,  "--filter {text}",                        "it writes a file, and none is named",                   "give it with filename=FILE"},
+    {Msg::filterRefused,     Exit::usage,  "--filter {text}",                        "it can't be used: {system}",                            "change its values, see 'tarsel modules'"},
+    {Msg::filterFileRefused, Exit::input,  "the filter {name} can't use {file}",     "{system}",                                              "check what the file holds"},
+    {Msg::filterFailed,      Exit::failed, "the filter {name} failed",               "{system}",                                              "nothing was left behind"},
+    {Msg::filterWriteFailed, Exit::output, "the filter {name} can't write its file", "{system}",                                              "choose another place"},
+    {Msg::filterWritesFile,  Exit::usage,  "--filter {text}",                        "it writes a file, and single pictures are no run",      "use it with 'tarsel transcode'"},
+    {Msg::chainRefused,      Exit::module, "the filters can't be used",              "{system}",                                              "'tarsel modules' lists what this installation has"},
+    {Msg::parameterUnknown,  Exit::usage,  "{option}",                               "{text} has no parameter {name}",                        "{hint}see docs/parameters.md"},
+    {Msg::parameterRefused,  Exit::usage,  "{option}",                               "{name} can't take this value: {system}",                "give another value"},
+    {Msg::moduleUnknown,     Exit::module, "there is no module {name}",              "this installation has none of this name and kind",      "{hint}'tarsel modules' lists all"},
+    {Msg::moduleUnusable,    Exit::module, "the module {name} can't be used",        "it does not start in this installation",                "install the engine again"},
+    {Msg::muxerUnknown,      Exit::module, "--muxer",                                "there is no multiplexer {name} for this tool",          "{hint}use rawmux, rawavimux or nullmux"},
+    {Msg::muxerUnusable,     Exit::module, "the multiplexer {name} can't be used",   "{system}",                                              "'tarsel modules' lists what this installation has"},
+    {Msg::outputNoModule,    Exit::module, "can't write {file}",                     "this installation can't write any output",              "install the engine again"},
+    {Msg::aviNoModule,       Exit::module, "can't write {file}",                     "this installation has no AVI output",                   "choose another format"},
     // outputs
     {Msg::outputExists,       Exit::output, "can't write {file}", "it exists",                       "use -y to overwrite it"},
     {Msg::outputIsInput,      Exit::output, "can't write {file}", "it is also an input",             "give the output another name"},
@@ -58,6 +179,30 @@ constexpr Message kMessages[] = {
     {Msg::outputFormatUnknown, Exit::usage,  "-o {file}",          "no output has the extension {name}", "name its format with --format, 'tarsel formats' lists all{text}"},
     {Msg::outputFormatMissing, Exit::usage,  "-o {file}",          "no extension says what to write",    "name its format with --format, 'tarsel formats' lists all"},
     {Msg::outputTwice,         Exit::usage,  "can't write {file}", "two files of this job would have this name", "give -o the extension of its format"},
+    {Msg::outputExists,       Exit::output, "can't write {file}",                 "it exists",                                 "use -y to overwrite it"},
+    {Msg::outputIsInput,      Exit::output, "can't write {file}",                 "it is also an input",                       "give the output another name"},
+    {Msg::outputIsOutput,     Exit::output, "can't write {file}",                 "it is also the output of the job",          "give one of them another name"},
+    {Msg::outputFolderAbsent, Exit::output, "can't write {file}",                 "the folder {file} does not exist",          "make the folder first"},
+    {Msg::outputSystem,       Exit::output, "can't write {file}",                 "{text}",                                    "{text}"},
+    {Msg::outputRefused,      Exit::output, "can't write {file}",                 "{system}",                                  "choose another name or format"},
+    {Msg::outputNoStream,     Exit::output, "can't write {file}",                 "it takes no further {text}",                "give fewer inputs, or another format"},
+    {Msg::outputNoSpace,      Exit::output, "can't write {file}",                 "it needs {text}, the disk has {text} free", "free some space, or choose another disk"},
+    {Msg::logNotWritten,      Exit::output, "can't write the log {file}",         "{text}",                                    "{text}"},
+    {Msg::standardOutput,     Exit::output, "can't write to the standard output", "{text}",                                    "{text}"},
+    // how a run ends
+    {Msg::linkFailed,       Exit::failed, "can't connect {file} to the output", "the engine refuses the two formats",       "see the log: tarsel --log stderr transcode ..."},
+    {Msg::jobFailed,        Exit::failed, "can't make {file}",                  "{system}",                                 "see the log: tarsel --log stderr transcode ..."},
+    {Msg::outputUnreadable, Exit::check,  "{file} failed its check",            "it can't be read back",                    "nothing was left behind; run it again"},
+    {Msg::outputDiffers,    Exit::check,  "{file} failed its check",            "it has {text} {text} in place of {text}",  "nothing was left behind; run it again"},
+    {Msg::postNotRun,       Exit::failed, "--post",                             "the command can't be run",                 "check it; {file} is complete"},
+    {Msg::postFailed,       Exit::failed, "--post",                             "the command ended with status {text}",     "check it; {file} is complete"},
+    {Msg::taskFailed,       Exit::failed, "can't make the task file {file}",    "the engine refuses the job",               "see the log: tarsel --log stderr transcode ..."},
+    {Msg::engineWarns,      Exit::done,   "{system}",                           "",                                         ""},
+    {Msg::outOfMemory,      Exit::failed, "out of memory",                      "the job needs more of it than there is",   "use smaller pictures, or end other programs"},
+    {Msg::temporaryFolder,  Exit::output, "can't use the temporary folder",     "{text}",                                   "set TMPDIR to a folder that exists"},
+    {Msg::pathFailed,       Exit::output, "can't use {file}",                   "{text}",                                   "{text}"},
+    {Msg::systemFailed,     Exit::failed, "the system refuses a call",          "{text}",                                   "{text}"},
+    {Msg::engineFailed,     Exit::failed, "the engine stopped",                 "one of its internal checks does not hold", "tarsel --log stderr ... shows which; please report it"},
 };
 // clang-format on
 
@@ -68,8 +213,14 @@ constexpr bool inOrder() {
 }
 static_assert(inOrder());
 
+// " Did you mean 'a'?" within a sentence.
+std::string hint(std::string_view suggested) {
+    return suggested.empty() ? "" : "d" + std::string(suggested.substr(2)) + " ";
+}
+
 std::string shown(std::string_view placeholder, std::string_view value) {
     if (placeholder == "file" || placeholder == "name") return inQuotes(value);
+    if (placeholder == "hint") return hint(value);
     return placeholder == "system" ? inLine(std::string(value)) : std::string(value);
 }
 
@@ -106,4 +257,15 @@ std::string lineOf(Msg id, Values values) {
 
 Failure failure(Msg id, Values values) {
     return {kMessages[static_cast<size_t>(id)].exit, lineOf(id, values)};
+}
+
+Failure systemFailure(Msg id, std::string_view file, int error) {
+    const SystemCause cause = causeOf(error);
+    return failure(id, {file, cause.why, cause.remedy});
+}
+
+Failure writeFailure(std::string_view file, std::string_view sentence) {
+    if (const auto cause = causeIn(sentence))
+        return failure(Msg::outputSystem, {file, cause->why, cause->remedy});
+    return failure(Msg::outputRefused, {file, sentence});
 }

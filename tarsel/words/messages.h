@@ -9,9 +9,129 @@
 #include "tarsel/words/failure.h"
 
 enum class Msg : unsigned char {
+    // the command line
+    commandMissing,
+    commandUnknown,
+    optionUnknown,
+    wordTooMany,
+    argumentMissing,
+    valueMissing,
+    valueNotTaken,
+    optionRepeated,
+    choiceUnknown,
+    commandLineWrong,
+    keyNotPair,
+    keyUnknown,
+    keyRepeated,
+    // values of options
+    timeWrong,
+    timeCountsFrames,
+    rateWrong,
+    sizeWrong,
+    sheetWrong,
+    wholeWrong,
+    decimalWrong,
+    bitsWrong,
+    pixelUnknown,
+    colourWrong,
+    encodingUnknown,
+    nameUnknown,
+    pairIncomplete,
+    // inputs
+    inputAbsent,
+    inputIsFolder,
+    inputNotRegular,
+    inputEmpty,
+    inputSystem,
+    inputUnknown,
+    inputIsRaw,
+    inputNoDecoder,
+    inputRefused,
+    inputFormat,
+    inputNotWav,
+    inputWavDamaged,
+    inputWavNoData,
+    inputNoScc,
+    inputNoCaptions,
+    inputNoSubtitles,
+    rawNoFile,
+    rawNoInput,
+    rawIncomplete,
+    rawTooShort,
+    streamRefused,
+    inputDamaged,
+    taskDamaged,
+    taskRefused,
+    fileDamaged,
+    inputEndedEarly,
+    inputDamagedTaken,
+    inputPartlyRead,
+    readFailed,
+    frameReadFailed,
+    inputNoPicture,
+    inputNoSound,
+    inputNoStreams,
+    fileNoPicture,
+    inputMissing,
+    inputUnused,
+    generatorSmall,
+    generatorNoFrame,
+    generatorFailed,
+    pictureNoPng,
+    pictureDamaged,
+    // parts of the input
+    toNotAfter,
+    fromAfterEnd,
+    atAfterEnd,
+    toAfterEnd,
+    noFrameBetween,
+    // pictures
+    matrixWrong,
+    matrixNoYuv,
+    cropWrong,
+    cropEmpty,
+    cropBeyond,
+    cropColumns,
+    cropRows,
+    cropRefused,
+    deinterlaceProgressive,
+    rateNotConverted,
+    styleAlone,
+    placeWrong,
+    logoNoFile,
+    logoBeyond,
+    logoNoPicture,
+    subtitlesNone,
+    fontWrong,
+    dropFrameNone,
+    frameTooLarge,
+    sheetFailed,
+    pictureName,
+    pictureFailed,
+    // filters and modules
+    filterUnknown,
+    filterNoStream,
+    effectNoPicture,
+    filterPlaceTaken,
+    filterFileMissing,
+    filterRefused,
+    filterFileRefused,
+    filterFailed,
+    filterWriteFailed,
+    filterWritesFile,
+    chainRefused,
+    parameterUnknown,
+    parameterRefused,
+    moduleUnknown,
+    moduleUnusable,
+    muxerUnknown,
+    muxerUnusable,
+    outputNoModule,
+    aviNoModule,
     // outputs
     outputExists,
     outputIsInput,
+    outputIsOutput,
     outputFolderAbsent,
     outputNotPlaced,
     outputTorn,
@@ -59,16 +179,38 @@ enum class Msg : unsigned char {
     outputFormatUnknown,
     outputFormatMissing,
     outputTwice,
+    outputSystem,
+    outputRefused,
+    outputNoStream,
+    outputNoSpace,
+    logNotWritten,
+    standardOutput,
+    // how a run ends
+    linkFailed,
+    jobFailed,
+    outputUnreadable,
+    outputDiffers,
+    postNotRun,
+    postFailed,
+    taskFailed,
+    engineWarns,
+    outOfMemory,
+    temporaryFolder,
+    pathFailed,
+    systemFailed,
+    engineFailed,
     count,  // of messages, none itself
 };
 
 // A line of the tool is "WHAT: WHY; REMEDY". What failed names a file or an option; why is the reason in the
-// user's words, or in the system's; the remedy says what to do, and is "" only where a warning needs none.
+// user's words, or in the system's; the remedy says what to do, and is "" only where a warning needs none. A
+// warning has Exit::done.
 //
 // The columns hold placeholders, which the values of a call fill in the order in which they stand:
 //     {file} {name}    a file's name or another word of the user's, shown in quotes
 //     {system}         a sentence of the engine's or the system's, made to fit into a line
 //     {option}         an option, shown as it is
+//     {hint}           what suggestion() says of a name that is not known, before the rest of a remedy
 //     {text}           a number or a word of the tool's, shown as it is
 struct Message {
     Msg id;
@@ -83,3 +225,7 @@ std::span<const Message> messages();
 std::string lineOf(Msg id, std::initializer_list<std::string_view> values = {});
 // The failure of a message, to be thrown.
 Failure failure(Msg id, std::initializer_list<std::string_view> values = {});
+// The failure of a message about a file whose why and remedy are those of an errno value.
+Failure systemFailure(Msg id, std::string_view file, int error);
+// That `file` can't be written, for what a sentence of the engine says.
+Failure writeFailure(std::string_view file, std::string_view sentence);

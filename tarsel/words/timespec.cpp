@@ -5,17 +5,12 @@
 #include <cstdio>
 #include <vector>
 
-#include "tarsel/words/failure.h"
+#include "tarsel/words/messages.h"
 
 namespace {
 
 constexpr long long kTicks = 35280000;              // a second of MediaTime
 constexpr long long kLongest = 1000LL * 3600 * 24;  // seconds; a bound, not a wish
-
-[[noreturn]] void refuse(std::string_view option, std::string_view text, std::string_view wanted) {
-    throw Failure(Exit::usage,
-                  std::string(option) + ": " + inQuotes(text) + " is not " + std::string(wanted));
-}
 
 std::optional<long long> number(std::string_view text) {
     long long value = 0;
@@ -35,7 +30,7 @@ std::vector<std::string_view> split(std::string_view text, std::string_view sepa
     return parts;
 }
 
-// "12.345" as ticks, exact to the tick; digits behind the ninth decimal do not count.
+// "12.345" as ticks, exact to the tick; digits after the ninth decimal do not count.
 std::optional<long long> secondsToTicks(std::string_view text) {
     const size_t point = text.find('.');
     const auto whole = number(text.substr(0, point));
@@ -69,25 +64,21 @@ std::optional<MediaTime> clockTime(const std::vector<std::string_view>& parts) {
 }  // namespace
 
 MediaTime parseTime(std::string_view text, const std::optional<QvFramerate>& rate, std::string_view option) {
-    constexpr std::string_view wanted =
-        "a time: use SS[.mmm], MM:SS, HH:MM:SS[.mmm], 120f, HH:MM:SS:FF or HH:MM:SS;FF";
+    const auto refuse = [&] { throw failure(Msg::timeWrong, {option, text}); };
     const auto needRate = [&]() -> const QvFramerate& {
-        if (!rate)
-            throw Failure(Exit::usage, std::string(option) + ": " + inQuotes(text) +
-                                           " counts frames, but the input has no frame rate; give seconds");
+        if (!rate) throw failure(Msg::timeCountsFrames, {option, text});
         return *rate;
     };
     if (!text.empty() && text.back() == 'f') {
         const auto frames = number(text.substr(0, text.size() - 1));
-        if (!frames || *frames < 0 || *frames > 0x7FFFFFFF) refuse(option, text, wanted);
+        if (!frames || *frames < 0 || *frames > 0x7FFFFFFF) refuse();
         return MediaTime(static_cast<long long>(*frames), needRate(), kTicks);
     }
     const auto parts = split(text, ":;");
     if (parts.size() == 4) {
         for (size_t i = 0; i < 4; ++i) {
             const auto value = number(parts[i]);
-            if (!value || *value < 0 || *value > (i == 0 ? 99 : i == 3 ? 999 : 59))
-                refuse(option, text, wanted);
+            if (!value || *value < 0 || *value > (i == 0 ? 99 : i == 3 ? 999 : 59)) refuse();
         }
         QvFramerate counting = needRate();
         const QvTimecode code{std::string(text).c_str()};
@@ -95,14 +86,14 @@ MediaTime parseTime(std::string_view text, const std::optional<QvFramerate>& rat
         const long long frame = code.frameNr(counting, false);
         return MediaTime(frame, counting, kTicks);
     }
-    if (text.find(';') != std::string_view::npos || parts.size() > 3) refuse(option, text, wanted);
+    if (text.find(';') != std::string_view::npos || parts.size() > 3) refuse();
     const auto time = clockTime(parts);
-    if (!time) refuse(option, text, wanted);
+    if (!time) refuse();
     return *time;
 }
 
 QvFramerate parseRate(std::string_view text, std::string_view option) {
-    constexpr std::string_view wanted = "a frame rate: use 25, 29.97, 30000/1001, or 25i and 25b for fields";
+    const auto refuse = [&] { throw failure(Msg::rateWrong, {option, text}); };
     std::string_view digits = text;
     int interlaced = 0;
     if (!digits.empty() && (digits.back() == 'i' || digits.back() == 'b' || digits.back() == 'p')) {
@@ -111,31 +102,30 @@ QvFramerate parseRate(std::string_view text, std::string_view option) {
     }
     if (const auto parts = split(digits, "/"); parts.size() == 2) {
         const auto num = number(parts[0]), den = number(parts[1]);
-        if (!num || !den || *num < 1 || *den < 1 || *num > 100000000 || *den > 1000000)
-            refuse(option, text, wanted);
+        if (!num || !den || *num < 1 || *den < 1 || *num > 100000000 || *den > 1000000) refuse();
         return QvFramerate(QvRatio(static_cast<int>(*num), static_cast<int>(*den)), interlaced);
     }
     double value = 0;
     const auto [end, error] = std::from_chars(digits.data(), digits.data() + digits.size(), value);
     if (error != std::errc() || end != digits.data() + digits.size() || !(value >= 0.001 && value <= 100000))
-        refuse(option, text, wanted);
+        refuse();
     return QvFramerate(value, interlaced);
 }
 
-Size parseSize(std::string_view text, std::string_view option) {
+Size parseSize(std::string_view text, std::string_view option, int most, Msg wrong) {
     const auto parts = split(text, "xX");
     if (parts.size() == 2) {
         const auto width = number(parts[0]), height = number(parts[1]);
-        if (width && height && *width >= 1 && *height >= 1 && *width <= 65535 && *height <= 65535)
+        if (width && height && *width >= 1 && *height >= 1 && *width <= most && *height <= most)
             return {static_cast<int>(*width), static_cast<int>(*height)};
     }
-    refuse(option, text, "a size such as 1280x720, each from 1 to 65535");
+    throw failure(wrong, {option, text});
 }
 
 long long parseNumber(std::string_view text, long long low, long long high, std::string_view option) {
     const auto value = number(text);
     if (!value || *value < low || *value > high)
-        refuse(option, text, "a whole number from " + std::to_string(low) + " to " + std::to_string(high));
+        throw failure(Msg::wholeWrong, {option, text, std::to_string(low), std::to_string(high)});
     return *value;
 }
 
@@ -145,8 +135,7 @@ unsigned parsePixel(std::string_view text, std::string_view option) {
         known.push_back(fourccText(format.fourcc));
         if (text == known.back()) return format.fourcc;
     }
-    throw Failure(Exit::usage, std::string(option) + ": there is no pixel format " + inQuotes(text) + "." +
-                                   suggestion(text, known) + " 'tarsel formats' lists all");
+    throw failure(Msg::pixelUnknown, {option, text, suggestion(text, known)});
 }
 
 std::string fourccText(unsigned fourcc) {

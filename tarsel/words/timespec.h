@@ -7,6 +7,8 @@
 
 #include <qvplugcore/qvplugcore.h>
 
+#include "tarsel/words/messages.h"
+
 // SS[.mmm], MM:SS[.mmm], HH:MM:SS[.mmm], 120f (frames), HH:MM:SS:FF and HH:MM:SS;FF (timecode). Frames and
 // timecode need `rate`. Throws Failure (usage) with `option` in the line.
 MediaTime parseTime(std::string_view text, const std::optional<QvFramerate>& rate, std::string_view option);
@@ -18,8 +20,8 @@ struct Size {
     int width;
     int height;
 };
-// "1280x720": both from 1 to 65535.
-Size parseSize(std::string_view text, std::string_view option);
+// "1280x720": both from 1 to `most`. Throws Failure with the message `wrong`.
+Size parseSize(std::string_view text, std::string_view option, int most = 65535, Msg wrong = Msg::sizeWrong);
 
 // A whole number within bounds.
 long long parseNumber(std::string_view text, long long low, long long high, std::string_view option);

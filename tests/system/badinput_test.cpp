@@ -20,16 +20,11 @@ TEST_F(BadInput, OneLineAndTheRightStatus) {
         const char* file;
         Words parts;
     } cases[] = {
-        {"absent.wav", {"no such file"}},
-        {"empty.wav/below.wav", {"can't open"}},
-        {"folder.wav", {"this is a folder"}},
-        {"empty.wav", {"the file is empty"}},
-        {"fifo.wav", {"no regular file"}},
-        {"text.wav", {"WAV"}},
-        {"alaw.wav", {"WAV"}},
-        {"plain", {"'plain'", "tarsel formats"}},
-        {"odd.xyz", {"'xyz'", "tarsel formats"}},
-        {"clip.yuv", {"--raw"}},
+        {"absent.wav", {"no such file"}},         {"empty.wav/below.wav", {"can't open"}},
+        {"folder.wav", {"this is a folder"}},     {"empty.wav", {"the file is empty"}},
+        {"fifo.wav", {"no regular file"}},        {"text.wav", {"WAV"}},
+        {"alaw.wav", {"A-law, 8 bits"}},          {"plain", {"'plain'", "tarsel formats"}},
+        {"odd.xyz", {"'xyz'", "tarsel formats"}}, {"clip.yuv", {"--raw"}},
     };
     for (const auto& c : cases) {
         const Words parts = c.parts + Words{"'" + std::string(c.file) + "'"};
@@ -42,6 +37,68 @@ TEST_F(BadInput, OneLineAndTheRightStatus) {
     fails(3, {"transcode", "good.wav", "-o", "out.yuv"}, {"no input has a picture", "'out.yuv'"});
     fails(3, asYuv({"transcode", "clip.yuv", "-o", "out.wav"}), {"no input has sound", "'out.wav'"});
     fails(3, {"frame", "good.wav", "-o", "out.png"}, {"'good.wav' has no picture"});
+}
+
+// What was found is named, in the words of a user.
+TEST_F(BadInput, TheReasonIsTheTrueOne) {
+    const auto wav = [&](const char* name, unsigned tag, unsigned channels, unsigned bits) {
+        folder.write(name,
+                     riff(wavChunk("fmt ", wavFormat(tag, channels, 8000, bits)) + wavChunk("data", "abcd")));
+    };
+    const std::string only =
+        "; only PCM of 8, 16 or 24 bits and 1 to 8 channels can be read; convert it first";
+    wav("ima.wav", 0x11, 1, 4);
+    wav("deep.wav", 1, 12, 32);
+    folder.write("cut.wav", riff(wavChunk("fmt ", wavFormat(1, 1, 8000, 16))));
+    folder.write("text.scc", "hello\n");
+    folder.write("none.scc", "Scenarist_SCC V1.0\n\n");
+    folder.write("text.srt", "hello\n");
+    folder.write("text.png", "hello\n");
+    works({"frame", "testgen:size=64x48", "-o", "whole.png"});
+    folder.write("half.png", contents("whole.png").substr(0, 300));
+    folder.write("sign.png", contents("whole.png").substr(0, 9));
+    const std::string damaged = ": the file is damaged; copy or make it again";
+    const struct {
+        Words words;
+        std::string line;
+    } cases[] = {
+        {{"info", "ima.wav"}, "can't open 'ima.wav': it holds IMA ADPCM, 4 bits" + only},
+        {{"info", "deep.wav"}, "can't open 'deep.wav': it holds PCM, 32 bits, 12 channels" + only},
+        {{"info", "cut.wav"},
+         "can't open 'cut.wav': it is a damaged WAV file without usable sound data; copy or make it again"},
+        {{"info", "text.scc"},
+         "can't open 'text.scc': this is no SCC file; its first line has to be Scenarist_SCC V1.0"},
+        {{"captions", "none.scc"}, "can't open 'none.scc': it has no caption lines; check how it was made"},
+        {{"frame", "testgen", "--subtitles", "text.srt", "-o", "x.png"},
+         "--subtitles: can't use 'text.srt': there are no subtitles in it; check that it is a subtitle file "
+         "(.srt or "
+         ".sub)"},
+        {{"frame", "testgen", "--timecode=font=text.srt", "-o", "x.png"},
+         "--timecode: font: can't use 'text.srt': it is no font; give a TrueType or OpenType font"},
+        {{"frame", "testgen:picture=text.png", "-o", "x.png"},
+         "can't read the picture 'text.png': it is no PNG file; give a PNG picture"},
+        {{"frame", "testgen:picture=half.png", "-o", "x.png"}, "can't read the picture 'half.png'" + damaged},
+        {{"frame", "testgen:picture=sign.png", "-o", "x.png"}, "can't read the picture 'sign.png'" + damaged},
+        {{"transcode", "testgen", "--logo", "half.png@1,1", "-o", "x.avi"},
+         "can't read the picture 'half.png'" + damaged},
+    };
+    for (const auto& c : cases) {
+        const Outcome o = tarsel(c.words);
+        EXPECT_EQ(o.status, 3) << c.line;
+        EXPECT_EQ(o.err, "tarsel: " + c.line + "\n");
+    }
+    EXPECT_EQ(size("x.png"), -1);
+    fails(3, {"frame", "testgen", "--filter", "logo:filename=half.png", "-o", "x.png"},
+          {"'half.png'", "is damaged"});
+    fails(4, {"--log", "no/x.log", "info", "testgen"}, {"'no/x.log'", "no such file or folder"});
+    // A disk that is full says so in each kind of output.
+    for (const char* name : {"out.png", "out.avi", "out.raw"}) {
+        const Outcome o = runProgram(
+            {"bash", "-c",
+             "ulimit -f 2; '" + program() + "' transcode testgen:size=128x72,duration=1 -o " + name},
+            here());
+        failsAs(4, o, {std::string("'") + name + "'", "a limit of the system", "ulimit -f"}, name);
+    }
 }
 
 TEST_F(BadInput, SeveralFilesAreAllLookedAt) {

@@ -20,7 +20,7 @@ TEST_F(Captions, LinesOfBothFieldsInTheOrderOfTime) {
                                testing::HasSubstr("\"bytes\":\"1520 d5ee 19b7\"")));
     folder.write("guess.scc", header + "00:00:00:02 9420\n9900:0:0:0 9420");
     for (const char* command : {"captions", "info"})
-        EXPECT_THAT(tarsel({command, "guess.scc"}).err, testing::HasSubstr("Framerate guess"));
+        EXPECT_THAT(tarsel({command, "guess.scc"}).err, testing::HasSubstr("framerate guess"));
 }
 
 TEST_F(Captions, InfoTellsWhatATextFileHolds) {

@@ -20,22 +20,65 @@ TEST_F(Command, WrongUseIsTold) {
         Words parts;
     } cases[] = {
         {2, {}, {"tarsel --help"}},
-        {2, {"transcoed"}, {"'transcoed'", "Did you mean 'transcode'?"}},
-        {2, {"transcode", "in.wav", "--ratte", "25", "-o", "x.wav"}, {"'--ratte'", "Did you mean '--rate'?"}},
+        {2, {"transcoed"}, {"'transcoed'", "did you mean 'transcode'?"}},
+        {2, {"transcode", "in.wav", "--ratte", "25", "-o", "x.wav"}, {"'--ratte'", "did you mean '--rate'?"}},
         {2, {"transcode", "in.wav", "--rate", "0", "-o", "x.wav"}, {"--rate", "'0'"}},
         {2,
          {"transcode", "testgen:rate=240", "--rate", "60", "-o", "x.raw"},
          {"--rate: 240 to 60", "up to 120"}},
         {5, {"transcode", "in.wav", "--muxer", "rawmx", "-o", "x.wav"}, {"'rawmx'", "'rawmux'"}},
         {5, {"transcode", "in.wav", "--filter", "qqqqqq", "-o", "x.wav"}, {"'qqqqqq'", "tarsel modules"}},
-        {2, {"transcode", "testgen:sizee=64x64", "-o", "x.raw"}, {"'sizee'", "Did you mean 'size'?"}},
+        {2, {"transcode", "testgen:sizee=64x64", "-o", "x.raw"}, {"'sizee'", "did you mean 'size'?"}},
         {2, {"transcode", "testgen:size=10x10", "-o", "x.raw"}, {"32x32"}},
-        {2, {"transcode", "testgen", "--pixel", "I42O", "-o", "x.raw"}, {"'I42O'", "Did you mean 'I420'"}},
+        {2, {"transcode", "testgen", "--pixel", "I42O", "-o", "x.raw"}, {"'I42O'", "did you mean 'I420'"}},
         {2,
          {"transcode", "testgen", "--filter", "flipper:flop=3", "-o", "x.raw"},
          {"'flop'", "no parameter"}},
     };
     for (const auto& c : cases) fails(c.status, c.words, c.parts);
+}
+
+// What the argument parser would take, or report in words of its own.
+TEST_F(Command, TheWholeLine) {
+    const std::string help = "; see 'tarsel transcode --help'", twice =
+                                                                    ": it is given twice, and only one value "
+                                                                    "counts; leave one out";
+    const struct {
+        Words words;
+        std::string line;
+    } cases[] = {
+        {{}, "no command: there is nothing to do; 'tarsel --help' lists all commands"},
+        {{"transcode"}, "INPUT is missing: the command needs it" + help},
+        {{"frame", "testgen"}, "--output is missing: the command needs it; see 'tarsel frame --help'"},
+        {{"transcode", "--foo"}, "unknown option '--foo': the command has none of this name" + help},
+        {{"modules", "x"},
+         "unknown argument 'x': the command takes no further one; see 'tarsel modules --help'"},
+        {{"transcode", "in.wav", "--from"}, "--from: it needs a value; give --from=TIME"},
+        {{"transcode", "in.wav", "--from=", "-o", "x.wav"}, "--from: it needs a value; give --from=TIME"},
+        {{"transcode", "in.wav", "-o", ""}, "--output: it needs a value; give --output=FILE"},
+        {{"transcode", "in.wav", "--timecode="},
+         "--timecode: it needs a value; give --timecode=START|K=V,..."},
+        {{"transcode", "in.wav", "--flip=3"}, "--flip: it takes no value, but has '3'; leave out the value"},
+        {{"transcode", "in.wav", "--to", "1", "--to=2"}, "--to" + twice},
+        {{"transcode", "in.wav", "-oa.wav", "-qyo", "b.wav"}, "--output" + twice},
+        {{"transcode", "in.wav", "--progress", "jsn"},
+         "--progress: 'jsn' is none of its values; did you mean 'json'? use auto, json, none"},
+        {{"transcode", "testgen:size=64x64,size=32x32", "-o", "x.raw"},
+         "testgen: the key 'size' is given twice, and only one value counts; leave one out"},
+        {{"frame", "testgen", "-o", "x.png", "--sheet", "0x0"},
+         "--sheet: '0x0' is not a sheet of pictures; use COLUMNSxROWS from 1x1 to 32x32"},
+        {{"transcode", "in.wav", "-o", "x.wav", "--from", "0.9", "--to", "0.1"},
+         "--to 0.1: it is not after --from 0.9; give a later --to"},
+        {{"transcode", "testgen", "--size", "65535x65535", "-o", "x.raw"},
+         "--size: a frame of 65535x65535 is too large for the memory, or above 2 GiB; give a smaller size"},
+    };
+    for (const auto& c : cases) {
+        const Outcome o = tarsel(c.words);
+        EXPECT_EQ(o.status, 2) << c.line;
+        EXPECT_EQ(o.err, "tarsel: " + c.line + "\n");
+    }
+    works({"transcode", "in.wav", "-qyoshort.wav"});
+    EXPECT_GE(size("short.wav"), size("in.wav"));
 }
 
 TEST_F(Command, HelpEverywhere) {
@@ -84,7 +127,7 @@ TEST_F(Command, AStandardOutputThatTakesNothing) {
                              {"transcode", "in.wav", "-o", "x.wav", "--dry-run"}}) {
         ProcessOptions full = here();
         full.outputTo = "/dev/full";
-        failsAs(4, tarsel(job, full), {"standard output", "No space left on device"}, job[0]);
+        failsAs(4, tarsel(job, full), {"standard output", "the disk is full"}, job[0]);
     }
     const Outcome o = runProgram(
         {"bash", "-c", "'" + program() + "' info in.wav --json | head -0; exit ${PIPESTATUS[0]}"}, here());
@@ -111,6 +154,14 @@ TEST_F(Command, ATaskFileHoldsTheJob) {
     for (const char* part : {"<TranscodeTask", "in.wav", "out.wav", "rawaenc", "rawmux", "ls %o"})
         EXPECT_THAT(task, HasSubstr(part));
     EXPECT_THAT(task, testing::Not(HasSubstr(".tarsel-")));
+    EXPECT_EQ(works({"info", "job.xml"}).out, "'job.xml'\n  a sound task\n");
+    folder.write("bad.xml",
+                 task.substr(0, task.find("<i32>")) + "<i32>x" + task.substr(task.find("<i32>") + 6));
+    fails(3, {"info", "bad.xml"}, {"'bad.xml' is no sound task: line 7, encoder/", "it is no whole number"});
+    folder.write("cut.xml", task.substr(0, 500));
+    fails(3, {"info", "cut.xml"}, {"'cut.xml' is no sound task: line ", "the document"});
+    folder.write("other.xml", "<doc/>");
+    fails(3, {"info", "other.xml"}, {"'other.xml'", "line 1", "this is no task"});
     fails(4, {"transcode", "in.wav", "-o", "out.wav", "--dry-run", "--save-task", "job.xml"},
           {"'job.xml'", "exists"});
 }

@@ -57,7 +57,7 @@ TEST_F(Picture, PointsThatHoldNothing) {
         Words points;
         Words parts;
     } cases[] = {
-        {{"--from", "3"}, {"--from 3", "behind the end", "0:00:01.000"}},
+        {{"--from", "3"}, {"--from 3", "after the end", "0:00:01.000"}},
         {{"--from", "0.5", "--to", "0.2"}, {"--to 0.2", "--from 0.5"}},
         {{"--from", "0.5", "--to", "0.501"}, {"no frame"}},
         {{"--to", "0:99"}, {"'0:99'", "is not a time"}},
