@@ -188,14 +188,17 @@ void PictureEffects::planCrop() {
 void PictureEffects::planMatrix(bool toPng) {
     const std::string& text = options_.matrix;
     if (text.empty()) return;
+    const size_t colon = text.find(':');
+    const int last =
+        matrixNumber(std::string_view(text).substr(colon == std::string::npos ? 0 : colon + 1), text);
     if (toPng && options_.pixel.empty()) out_.fourcc = QvFourcc::BGR3;
     const bool yuvIn = isYuv(in_.fourcc), yuvOut = isYuv(out_.fourcc);
     if (!yuvIn && !yuvOut) throw failure(Msg::matrixNoYuv);
-    if (const size_t colon = text.find(':'); colon != std::string::npos) {
+    if (colon != std::string::npos) {
         inMatrix_ = matrixNumber(std::string_view(text).substr(0, colon), text);
-        outMatrix_ = matrixNumber(std::string_view(text).substr(colon + 1), text);
+        outMatrix_ = last;
     } else {
-        (yuvOut ? outMatrix_ : inMatrix_) = matrixNumber(text, text);
+        (yuvOut ? outMatrix_ : inMatrix_) = last;
     }
 }
 

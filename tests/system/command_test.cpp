@@ -78,6 +78,9 @@ TEST_F(Command, TheWholeLine) {
         EXPECT_EQ(o.err, "tarsel: " + c.line + "\n");
     }
     works({"transcode", "in.wav", "-qyoshort.wav"});
+    works({"transcode", "in.wav", "-o", "Upper.WAV"});
+    EXPECT_GE(size("Upper.WAV"), size("in.wav"));
+    EXPECT_EQ(size("Upper.wav"), -1);
     EXPECT_GE(size("short.wav"), size("in.wav"));
 }
 

@@ -76,7 +76,8 @@ TEST_F(Output, AWriteThatFailsLeavesNothing) {
         EXPECT_EQ(listing(), before);
     }
     folder.write("out.wav", "precious");
-    failsAs(4, tarsel({"transcode", "long.wav", "-o", "out.wav", "-y"}, limited), {"a limit of the system"}, "-y");
+    failsAs(4, tarsel({"transcode", "long.wav", "-o", "out.wav", "-y"}, limited), {"a limit of the system"},
+            "-y");
     EXPECT_EQ(contents("out.wav"), "precious");
 }
 
