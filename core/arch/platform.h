@@ -64,6 +64,11 @@ class QvCancel;
 
 enum class QvFontFace { sans, sansItalic, sansBold, monospaceBold };
 
+struct QvFontFile {
+    std::string name;
+    int face = 0;  // which one of those that the file holds
+};
+
 class QV_API QvPlatform {
   public:
     virtual ~QvPlatform();
@@ -169,6 +174,12 @@ class QV_API QvPlatform {
     // U+FFFD, a byte each. False if the system does not know the code page.
     virtual bool decodeCodepage(int number, std::string_view bytes, std::u32string& text);
     virtual std::string fontFile(QvFontFace face);  // full name, empty if the system has no font at all
+    // Fonts that together have as many of the letters as the system's fonts can draw, nearest to `like` first.
+    virtual std::vector<QvFontFile> fontsWith(std::u32string_view letters, QvFontFace like);
+    // The font of an installed family, or of one that the system takes in its place, with the weight and the
+    // slant of `like`. The name is empty if there is none.
+    virtual QvFontFile fontOf(const std::string& family, QvFontFace like);
+    virtual std::vector<std::string> fontFamilies();  // sorted
     virtual std::string cpuFeatures();              // "MMX SSE2 ...", in a fixed order
     virtual std::string platformName();             // "Linux x64"
     virtual std::uint32_t randomBits();             // from the system's entropy: two processes do not meet

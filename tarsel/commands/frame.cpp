@@ -132,6 +132,8 @@ void addFrame(CommandLine& line, Signals& signals) {
     command.option("-o,--output", given->output, "The picture; - is the standard output", "FILE.png",
                    Need::required);
     addEffectOptions(command, given->effects);
+    command.flag("--accept-partial", given->effects.acceptPartial,
+                 "Take what can be read of damaged subtitles");
     given->outputOptions.add(command);
     command.action([given] { frame(*given); });
 }

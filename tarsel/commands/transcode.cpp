@@ -26,6 +26,7 @@ void resolve(Given& given) {
     job.policy = given.outputs.policy();
     job.policy.recover = !job.dryRun;
     job.policy.quiet = job.quiet;
+    job.effects.acceptPartial = job.acceptPartial;
     if (!given.samplerate.empty())
         job.samplerate = static_cast<int>(parseNumber(given.samplerate, 1000, 768000, "--samplerate"));
     if (!given.channels.empty())

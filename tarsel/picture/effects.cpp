@@ -50,7 +50,8 @@ void addEffectOptions(Command& command, EffectOptions& options) {
                  "FILE@X,Y[,OPACITY]");
     command.option("--subtitles", options.subtitles, "Burn in the subtitles of an .srt or .sub file", "FILE");
     command.option("--subtitle-style", options.subtitleStyle,
-                   "Keys size, color, font, effect, encoding, delay, speed, rate", "K=V,...");
+                   "Keys size, color, font, effect, align, margin, wrap, encoding, delay, speed, rate",
+                   "K=V,...");
     command.flagOrValue(
         "--timecode", options.timecode,
         "Burn in the timecode of the input, or from START on; keys start, mode=frames, x, y, size, "

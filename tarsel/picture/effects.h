@@ -12,6 +12,7 @@ struct EffectOptions {
     std::string deinterlace, crop, fade, timecode, subtitles, subtitleStyle;
     std::vector<std::string> logos, filters;
     bool flip = false;
+    bool acceptPartial = false;  // subtitles that can't be read are left out
 
     bool any() const;
     // The first given option that needs a picture; --filter is not asked.

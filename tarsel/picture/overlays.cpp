@@ -16,6 +16,8 @@ constexpr int kVideoFilter = 12;
 constexpr int kLinesOfText = 18;  // of subtitles that would fill a picture
 constexpr int kLeastText = 14;    // pixels
 constexpr int kShadow = 2;        // fontEffect
+constexpr int kBottom = 2;        // align
+constexpr const char* kTitleSafe = "5%";
 
 constexpr struct {
     const char* name;
@@ -168,10 +170,60 @@ AnyDict logoState(const std::string& spec, const PictureFormat& picture) {
 
 namespace {
 
-void setFont(QvCodec& filter, const std::string& file, const std::string& what) {
-    requireInput(file);
-    if (!QvText::isFont(Any(file.c_str()))) throw failure(Msg::fontWrong, {what, file});
-    setChecked(filter, "font_filename", file.c_str(), what);
+bool isFamily(const std::string& name) { return qv_registry()->hasFontFamily(name.c_str()); }
+
+// What has a folder or an ending was meant to be a file.
+void checkFont(const std::string& name, const std::string& what) {
+    if (exists(name) || name.find_first_of("/.") != std::string::npos) {
+        requireInput(name);
+        if (!QvText::isFont(Any(name.c_str()))) throw failure(Msg::fontWrong, {what, name});
+        return;
+    }
+    if (isFamily(name)) return;
+    std::vector<std::string> families;
+    for (const Any& family : qv_registry()->fontFamilies()) families.emplace_back(family.asString(""));
+    std::string near = suggestion(name, families);
+    if (!near.empty()) near = near.substr(1) + " ";
+    throw failure(Msg::noSuchFont, {what, name, near});
+}
+
+void setFont(QvCodec& filter, const std::string& name, const std::string& what) {
+    checkFont(name, what);
+    setChecked(filter, exists(name) ? "font_filename" : "font_family", name.c_str(), what);
+}
+
+// Where text stands, in the order of the keys of numbers.
+const std::vector<std::string> kPlaces = {"bottom-left", "bottom",   "bottom-right", "left",     "middle",
+                                          "right",       "top-left", "top",          "top-right"};
+
+int parseAlign(const std::string& text, const std::string& what) {
+    const auto found = std::find(kPlaces.begin(), kPlaces.end(), text);
+    if (found != kPlaces.end()) return static_cast<int>(found - kPlaces.begin()) + 1;
+    std::string all;
+    for (const auto& place : kPlaces) all += (all.empty() ? "" : ", ") + place;
+    throw failure(Msg::noSuchAlign, {what, text, all});
+}
+
+// Of a picture's width or height.
+int parseMargin(const std::string& text, int length, const std::string& what) {
+    double value = 0;
+    const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), value);
+    const std::string_view unit = std::string_view(text).substr(static_cast<size_t>(end - text.data()));
+    const double pixels = unit == "%" ? value * length / 100 : value;
+    if (error != std::errc() || !(unit.empty() || unit == "%") || !(pixels >= 0 && pixels * 2 < length))
+        throw failure(Msg::noMargin, {what, text});
+    return static_cast<int>(pixels);
+}
+
+void setMargin(QvCodec& filter, const std::string& text, const PictureFormat& picture,
+               const std::string& what) {
+    setChecked(filter, "marginX", parseMargin(text, picture.width, what), what);
+    setChecked(filter, "marginY", parseMargin(text, picture.height, what), what);
+}
+
+int parseSwitch(const std::string& text, const std::string& what) {
+    if (text != "on" && text != "off") throw failure(Msg::noSwitch, {what, text});
+    return text == "on";
 }
 
 int parseTextSize(const std::string& text, const std::string& what) {
@@ -179,7 +231,8 @@ int parseTextSize(const std::string& text, const std::string& what) {
 }
 
 // One key of --subtitle-style.
-void setStyle(QvCodec& filter, const std::string& key, const std::string& value) {
+void setStyle(QvCodec& filter, const std::string& key, const std::string& value,
+              const PictureFormat& picture) {
     const std::string what = "--subtitle-style: " + key;
     if (key == "size") setChecked(filter, "font_size", parseTextSize(value, what), what);
     if (key == "color") setChecked(filter, "color", parseColour(value, what), what);
@@ -189,13 +242,48 @@ void setStyle(QvCodec& filter, const std::string& key, const std::string& value)
     if (key == "delay") setChecked(filter, "delay", 1000 * parseDecimal(value, -86400, 86400, what), what);
     if (key == "speed") setChecked(filter, "speed", parseDecimal(value, 0.001, 1000, what), what);
     if (key == "rate") setChecked(filter, "framerate", Any(parseRate(value, what)), what);
+    if (key == "align") setChecked(filter, "align", parseAlign(value, what), what);
+    if (key == "margin") setMargin(filter, value, picture, what);
+    if (key == "wrap") setChecked(filter, "wrap", parseSwitch(value, what), what);
+}
+
+// Reads the file as the filter will.
+void checkSubtitles(const std::string& file, const QvCodec& filter, bool acceptPartial) {
+    using Findings = QvSubtitleFindings;
+    QvSubtitles subtitles;
+    Findings found;
+    subtitles.readFile(Any(file.c_str()), QvFramerate(QvRatio(25, 1)), filter.getParam("encoding").toInt32(),
+                       found);
+    const std::string line = std::to_string(found.line);
+    if (found.problem == Findings::unreadable) throw failure(Msg::subtitlesOtherFile, {file});
+    if (found.problem == Findings::noText) throw failure(Msg::subtitlesNoText, {file});
+    if (found.problem == Findings::unknownEncoding) throw failure(Msg::subtitlesEncodingUnknown, {file});
+    if (acceptPartial) return;
+    if (found.problem == Findings::noSubtitles) throw failure(Msg::subtitlesNone, {file});
+    if (found.problem == Findings::otherEncoding && found.encoding.empty())
+        throw failure(Msg::subtitlesNotInEncoding, {file, line});
+    if (found.problem == Findings::otherEncoding)
+        throw failure(Msg::subtitlesInOtherEncoding, {file, line, found.encoding});
+    if (found.lost > 0)
+        throw failure(Msg::subtitlesLost, {file, std::to_string(found.lost),
+                                           std::to_string(found.lost + subtitles.nrSubtitles())});
 }
 
 // Letters that stand out from any picture; a size of 0 is their usual one.
 void setTextSize(QvCodec& filter, int size, const PictureFormat& picture, const std::string& what) {
-    AnyDict rendering("charSizePt", size);
+    const Any before = filter.getParam("renderingOptions");
+    AnyDict rendering = before.isDict() ? before.asDict() : AnyDict();
+    rendering.set("charSizePt", size);
     rendering.set("fontEffect", kShadow);
     if (const double aspect = picture.pixelAspect(); aspect != 1) rendering.set("pixelAspect", aspect);
+    setChecked(filter, "renderingOptions", rendering, what);
+}
+
+void setTimecodeFont(QvCodec& filter, const std::string& name, const std::string& what) {
+    checkFont(name, what);
+    if (exists(name)) return setChecked(filter, "font_filename", name.c_str(), what);
+    AnyDict rendering = filter.getParam("renderingOptions").asDict();
+    rendering.set("fontFamily", name.c_str());
     setChecked(filter, "renderingOptions", rendering, what);
 }
 
@@ -216,35 +304,30 @@ void setTimecode(QvCodec& filter, const std::string& key, const std::string& val
     if (key == "y") setChecked(filter, "positionY", place(picture.height), what);
     if (key == "size") setTextSize(filter, parseTextSize(value, what), picture, what);
     if (key == "color") setColour(filter, parseColour(value, what), what);
-    if (key == "font") setFont(filter, value, what);
+    if (key == "font") setTimecodeFont(filter, value, what);
 }
 
 }  // namespace
 
-namespace {
-
-// Nothing to burn in is no result.
-void requireSubtitles(const std::string& file) {
-    requireInput(file);
-    QvSubtitles read;
-    if (read.parseFile(file.c_str(), QvFramerate(QvRatio(25, 1))) != QvStatus::ok ||
-        (read.nrSubtitles() == 0 && read.unread() == 0))
-        throw failure(Msg::subtitlesNone, {file});
-}
-
-}  // namespace
-
-AnyDict subtitleState(const std::string& file, const std::string& style, const PictureFormat& picture) {
+AnyDict subtitleState(const std::string& file, const std::string& style, const PictureFormat& picture,
+                      bool acceptPartial) {
     const std::string option = "--subtitles";
-    requireSubtitles(file);
+    requireInput(file);
     const auto filter = makeAnyCodec("subtitle", kVideoFilter);
     setChecked(*filter, "subtitle_filename", file.c_str(), option);
     setChecked(*filter, "font_size", std::max(picture.height / kLinesOfText, kLeastText), option);
     setChecked(*filter, "fontEffect", kShadow, option);
     setChecked(*filter, "pixelAspect", picture.pixelAspect(), option);
-    const KeyValues keys(style, {"size", "color", "font", "effect", "encoding", "delay", "speed", "rate"},
-                         "--subtitle-style");
-    for (const auto& [key, value] : keys.all()) setStyle(*filter, key, value);
+    setChecked(*filter, "normalize", 1, option);
+    setChecked(*filter, "wrap", 1, option);
+    setChecked(*filter, "align", kBottom, option);
+    setMargin(*filter, kTitleSafe, picture, option);
+    const KeyValues keys(
+        style,
+        {"size", "color", "font", "effect", "encoding", "delay", "speed", "rate", "align", "margin", "wrap"},
+        "--subtitle-style");
+    for (const auto& [key, value] : keys.all()) setStyle(*filter, key, value, picture);
+    checkSubtitles(file, *filter, acceptPartial);
     return stateOf(*filter);
 }
 

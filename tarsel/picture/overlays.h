@@ -8,7 +8,9 @@
 
 // "FILE@X,Y,OPACITY" of --logo.
 AnyDict logoState(const std::string& spec, const PictureFormat& picture);
-AnyDict subtitleState(const std::string& file, const std::string& style, const PictureFormat& picture);
+// `acceptPartial`: subtitles that can't be read may be left out.
+AnyDict subtitleState(const std::string& file, const std::string& style, const PictureFormat& picture,
+                      bool acceptPartial);
 // `alone`: as in PictureEffects::filters. `atTop`: out of the way of subtitles.
 AnyDict timecodeState(const std::string& spec, const PictureFormat& picture, bool alone, bool atTop);
 AnyDict fadeState(const std::string& spec, const PictureFormat& picture, long long frames);

@@ -252,7 +252,8 @@ void PictureEffects::addOptions(FiltersState& state, long long frames, bool alon
     const bool apart = text && frameFormat(out_.fourcc) == QvFourcc::I422;
     if (apart) append(state, scalerState(out_.width, out_.height, QvFourcc::YUYV), false);
     if (!options_.subtitles.empty())
-        append(state, subtitleState(options_.subtitles, options_.subtitleStyle, out_), false);
+        append(state, subtitleState(options_.subtitles, options_.subtitleStyle, out_, options_.acceptPartial),
+               false);
     if (!options_.fade.empty()) append(state, fadeState(options_.fade, out_, frames), false);
     if (!options_.timecode.empty())
         append(state, timecodeState(options_.timecode, out_, alone, !options_.subtitles.empty()), false);

@@ -1,6 +1,7 @@
 #include "builtin/video/overlay/subtitlewriter.h"
 
 #include <algorithm>
+#include <cstdio>
 
 #include "builtin/creators.h"
 #include "core/caption/text/qvtext.h"
@@ -18,6 +19,7 @@ using Settings = SubtitleSettings;
 using Options = QvTextRenderingOptions;
 
 constexpr int largestFont = 4096;
+constexpr int mostMargin = 65535;  // pixels
 constexpr double mostSpeed = 1000;
 constexpr double mostDelay = 1e9;  // ms, eleven days
 
@@ -80,6 +82,7 @@ using Access = QvParamAccess<Settings>;
 constexpr QvParamRow<Settings> rows[] = {
     {"subtitle_filename", &Settings::file, qvParamStored},
     {"font_filename", &Settings::font, qvParamStored},
+    {"font_family", &Settings::family, qvParamStored},
     {"font_size", &Settings::fontSize, qvParamStored, 1, largestFont},
     {"speed", &Settings::speed, qvParamStored, 0, mostSpeed},
     {"delay", &Settings::delay, qvParamStored, -mostDelay, mostDelay},
@@ -89,6 +92,11 @@ constexpr QvParamRow<Settings> rows[] = {
     {"fontEffect", &Settings::fontEffect, qvParamStored, 0, Options::nrEffects - 1},
     {"pixelAspect", &Settings::pixelAspect, qvParamStored, 0.1, 10},
     {"fontEffectRange", Access{nullptr, getEffects}},
+    {"normalize", &Settings::normalize, qvParamStored},
+    {"wrap", &Settings::wrap, qvParamStored},
+    {"align", &Settings::align, qvParamStored, 0, 9},
+    {"marginX", &Settings::marginX, qvParamStored, 0, mostMargin},
+    {"marginY", &Settings::marginY, qvParamStored, 0, mostMargin},
     {"color", &Settings::color, qvParamStored, 0, 0xFFFFFF},
     {"colorR", Access{setByte<16>, getByte<16>}},
     {"colorG", Access{setByte<8>, getByte<8>}},
@@ -121,8 +129,8 @@ AnyVector paramSet() {
     return set;
 }
 
-// `marked`: the file has a byte order mark, and so is UTF-8 by now.
-Options optionsOf(const Settings& settings, bool marked) {
+// `isUtf8`: the text is by now, because the file has a byte order mark or was converted.
+Options optionsOf(const Settings& settings, bool isUtf8) {
     Options options;
     if (settings.font.empty()) {
         options.fontRegular = qv_registry()->defaultFontFile(0);
@@ -133,11 +141,44 @@ Options optionsOf(const Settings& settings, bool marked) {
         options.fontRegular = settings.font.c_str();
     }
     options.charSize = settings.fontSize;
-    options.subEncoding = marked ? Options::utf8 : std::min<int>(settings.encoding, Options::byCodePage);
+    options.subEncoding = isUtf8 ? Options::utf8 : std::min<int>(settings.encoding, Options::byCodePage);
     options.codePage = settings.encoding >= Options::byCodePage ? settings.encoding : 0;
     options.fontEffect = settings.fontEffect;
     options.pixelAspect = settings.pixelAspect;
+    if (!settings.family.empty()) options.fontFamily = settings.family.c_str();
+    options.wrap = settings.wrap;
+    options.align = settings.align;
+    options.marginX = settings.marginX;
+    options.marginY = settings.marginY;
     return options;
+}
+
+void warnOfReading(const QvSubtitleFindings& findings, const char* file) {
+    if (findings.problem == QvSubtitleFindings::noSubtitles)
+        qv_log()->warning("Subtitle file %s has no subtitles", file);
+    if (findings.lost > 0)
+        qv_log()->warning("Subtitle file %s: %d subtitles are left out, their times can't be read", file,
+                          findings.lost);
+    if (findings.problem == QvSubtitleFindings::otherEncoding)
+        qv_log()->warning("Subtitle file %s: line %lld is not in its encoding", file, findings.line);
+    if (findings.guessed)
+        qv_log()->warning("Subtitle file %s does not say its encoding, it is read as %s", file,
+                          findings.encoding.c_str());
+}
+
+// The first few letters by themselves, the others by their number.
+void warnOfLetters(const std::u32string& letters, const std::string& file) {
+    if (letters.empty()) return;
+    constexpr std::size_t most = 5;
+    std::string names;
+    for (const char32_t letter : std::u32string_view(letters).substr(0, most)) {
+        char code[16];
+        std::snprintf(code, sizeof code, "U+%04X ", static_cast<unsigned>(letter));
+        names += (names.empty() ? "" : ", ") + std::string(code) + QvText::toUtf8({&letter, 1});
+    }
+    if (letters.size() > most) names += " and " + std::to_string(letters.size() - most) + " more";
+    qv_log()->warning("Subtitle file %s: no font of this system has %s; they are drawn as boxes",
+                      file.c_str(), names.c_str());
 }
 
 }  // namespace
@@ -175,19 +216,37 @@ int SubtitleWriter::load() {
 
     rateKnown_ = settings_.framerate.isFramerate();
     QvSubtitles read;
-    if (read.parseFile(settings_.file.c_str(), rateKnown_ ? settings_.framerate.asFramerate()
-                                                          : QvFramerate(QvRatio(25, 1))) != QvStatus::ok)
-        return setError(QvStatus::cannotParse, "Failed to read subtitle file %s", settings_.file.c_str());
-    if (read.unread() > 0)
-        qv_log()->warning("Subtitle file %s: the last %lld bytes of its text are not read",
-                          settings_.file.c_str(), read.unread());
-    else if (read.nrSubtitles() == 0)
-        qv_log()->warning("Subtitle file %s has no subtitles", settings_.file.c_str());
-    const Options options = optionsOf(settings_, read.encoding() != QvSubtitles::markNone);
+    if (const int result = readFile(read)) return result;
+    const bool isUtf8 = settings_.normalize || read.encoding() != QvSubtitles::markNone;
+    const Options options = optionsOf(settings_, isUtf8);
     overlay::warnOfFonts(options);
     if (render_.init(options) != QvStatus::ok)
         return setError(QvStatus::failed, "Unable to load font rendering library.");
+    warnOfLetters(render_.findFonts(read), settings_.file);
     subtitles_ = std::move(read);
+    return QvStatus::ok;
+}
+
+int SubtitleWriter::readFile(QvSubtitles& read) {
+    const QvFramerate rate = rateKnown_ ? settings_.framerate.asFramerate() : QvFramerate(QvRatio(25, 1));
+    const char* const file = settings_.file.c_str();
+    if (settings_.normalize) {
+        QvSubtitleFindings findings;
+        const int result = read.readFile(file, rate, settings_.encoding, findings);
+        if (result != QvStatus::ok && findings.problem != QvSubtitleFindings::noSubtitles)
+            return setError(QvStatus::cannotParse, "Failed to read subtitle file %s", file);
+        if (findings.hasRate && rateKnown_) read.changeFramerate(rate);
+        rateKnown_ |= findings.hasRate;
+        warnOfReading(findings, file);
+        return QvStatus::ok;
+    }
+    if (read.parseFile(file, rate) != QvStatus::ok)
+        return setError(QvStatus::cannotParse, "Failed to read subtitle file %s", file);
+    if (read.unread() > 0)
+        qv_log()->warning("Subtitle file %s: the last %lld bytes of its text are not read", file,
+                          read.unread());
+    else if (read.nrSubtitles() == 0)
+        qv_log()->warning("Subtitle file %s has no subtitles", file);
     return QvStatus::ok;
 }
 

@@ -3,6 +3,7 @@
 //     name                 type       default  meaning
 //     "subtitle_filename"  path       ""       an "srt" or "sub" file; without one nothing is drawn
 //     "font_filename"      path       ""       of all three faces; "": the sans fonts of the system
+//     "font_family"        string     ""       goes before "font_filename" if the system has a font of it
 //     "font_size"          int        32       pixels, 1 to 4096
 //     "speed"              double     1.0      of the subtitles' clock against the picture's, from 0 on
 //     "delay"              double     0.0      ms by which the subtitles come later
@@ -13,6 +14,13 @@
 //     "fontEffect"         int        0        0 to 3
 //     "fontEffectRange"    list       -        read only: likewise, "No effect", "Outline", ...
 //     "pixelAspect"        double     1.0      width to height of the picture's pixels, 0.1 to 10
+//     "normalize"          bool       false    reads the file with QvSubtitles::readFile: for files of any
+//                                              origin, of unknown encoding, with times that are no SubRip's
+//     "wrap"               bool       false    lines wider than the picture, less the margins, become several
+//     "align"              int        0        0: by the size of the letters; 1 to 9: within the margins, as
+//                                              on the keys of numbers, 2 at the bottom; see "align" of
+//                                              QvTextRenderingOptions
+//     "marginX", "marginY" int        0        pixels, with "align" or "wrap"
 //     "color"              int        white    0xRRGGBB
 //     "colorR", "colorG", "colorB"    255      its bytes
 //     "format"             int        0        read only: 1 SRT, 2 SUB, 0 while no file is loaded
@@ -30,7 +38,7 @@
 #include "core/caption/subtitle/qvsubtitles.h"
 
 struct SubtitleSettings {
-    std::string file, font;
+    std::string file, font, family;
     int fontSize = 32;
     double speed = 1.0;
     double delay = 0.0;
@@ -38,6 +46,8 @@ struct SubtitleSettings {
     Any framerate;
     int fontEffect = 0;
     double pixelAspect = 1;
+    bool normalize = false, wrap = false;
+    int align = 0, marginX = 0, marginY = 0;
     int color = 0xFFFFFF;
 };
 
@@ -56,6 +66,7 @@ class SubtitleWriter : public OverlayOf<SubtitleSettings> {
 
   private:
     int load();
+    int readFile(QvSubtitles& read);
 
     std::optional<QvSubtitles> subtitles_;
     QvSubtitleRender render_;

@@ -5,11 +5,13 @@
 #include <string>
 #include <string_view>
 
+#include "core/arch/platform.h"
 #include "core/arch/qvassert.h"
 #include "core/caption/subtitle/qvsubtitles.h"
 #include "core/caption/text/drawntexts_p.h"
 #include "core/caption/text/qvtext.h"
 #include "core/caption/text/qvtextrenderingoptions.h"
+#include "core/caption/text/styledtext_p.h"
 #include "core/caption/text/textmask_p.h"
 #include "core/engine/status.h"
 #include "core/filter/qvcolorconvert.h"
@@ -106,6 +108,9 @@ struct QvSubtitleRender::Private {
     int size;
     int lineHeight;
     int effect;
+    bool wrap;
+    int align;
+    int marginX, marginY;
     DrawnTexts texts;
     QvFrame band;  // BGR4, on its way to another format or into an effect
     std::unique_ptr<QvColorConverter> converter;
@@ -117,12 +122,26 @@ struct QvSubtitleRender::Private {
         : encoding(encodingOf(options)),
           size(std::clamp(options.charSize, 0, FontFace::largestSize)),
           lineHeight(static_cast<int>(size * lineSpacing)),
-          effect(options.fontEffect) {
+          effect(options.fontEffect),
+          wrap(options.wrap),
+          align(std::clamp(options.align, 0, 9)),
+          marginX(std::clamp(options.marginX, 0, farthest)),
+          marginY(std::clamp(options.marginY, 0, farthest)) {
         if (!library.get()) return;
         const Any* files[] = {&options.fontRegular, &options.fontItalic, &options.fontBold};
-        for (std::size_t i = 0; i < faces.size(); ++i)
-            faces[i].load(library, files[i]->isText() ? *files[i] : options.fontRegular, options.charSize,
-                          aspectOf(options));
+        for (std::size_t i = 0; i < fontStyles; ++i)
+            load(i, files[i]->isText() ? *files[i] : options.fontRegular, options);
+        faces.fallBack(library, options.charSize, aspectOf(options));
+    }
+
+    void load(std::size_t style, const Any& file, const Options& options) {
+        static constexpr QvFontFace likes[] = {QvFontFace::sans, QvFontFace::sansItalic,
+                                               QvFontFace::sansBold};
+        QvFontFile found;
+        if (options.fontFamily.isText())
+            found = qv_platform().fontOf(options.fontFamily.toString().asString(""), likes[style]);
+        faces[style].load(library, found.name.empty() ? file : Any(found.name.c_str()), options.charSize,
+                          aspectOf(options), found.face);
     }
 
     static double aspectOf(const Options& options) {
@@ -154,20 +173,42 @@ struct QvSubtitleRender::Private {
         }
     }
 
-    void layOut(DrawnText& text) {
-        const std::u32string all =
-            text.encoding == noEncoding ? std::u32string() : QvText::toUtf32(text.text, text.encoding);
-        FontStyle style = FontStyle::regular;
-        std::size_t count = 0;
-        for (std::size_t begin = 0; begin <= all.size(); ++count) {
-            const std::size_t end = std::min(all.find(U'|', begin), all.size());
-            if (count == text.lines.size()) text.lines.emplace_back();
-            DrawnLine& drawn = text.lines[count];
-            drawn.line = layOutLine(std::u32string_view(all).substr(begin, end - begin), faces, style);
-            drawn.covered = coverOf(drawn.line);
+    static std::u32string decoded(std::string_view text, int encoding) {
+        return encoding == noEncoding ? std::u32string() : QvText::toUtf32(text, encoding);
+    }
+
+    template <class Take>
+    static void forLines(std::u32string_view text, Take take) {
+        for (std::size_t begin = 0; begin <= text.size();) {
+            const std::size_t end = std::min(text.find(U'|', begin), text.size());
+            take(text.substr(begin, end - begin));
             begin = end + 1;
         }
+    }
+
+    void layOut(DrawnText& text) {
+        const std::u32string all = decoded(text.text, text.encoding);
+        text.align = placeTag(all);
+        FontStyle style = FontStyle::regular;
+        std::size_t count = 0;
+        forLines(all, [&](std::u32string_view source) {
+            for (TextLine& line : layOutLines(source, faces, style, text.widest)) {
+                if (count == text.lines.size()) text.lines.emplace_back();
+                DrawnLine& drawn = text.lines[count++];
+                drawn.line = std::move(line);
+                drawn.covered = coverOf(drawn.line);
+            }
+        });
         text.lines.resize(count);
+    }
+
+    void collectMissing(const QvSubtitle& subtitle, FontFaces::Missing& missing) {
+        const bool wide = subtitle.text.isWString();
+        const Any text = wide ? subtitle.text.toString() : subtitle.text;
+        FontStyle style = FontStyle::regular;
+        forLines(decoded(bytesOf(text), wide ? QvText::utf8 : encoding), [&](std::u32string_view line) {
+            ::collectMissing(withoutTags(line, style), faces, missing);
+        });
     }
 
     QvRect coverOf(const TextLine& line) const {
@@ -180,15 +221,36 @@ struct QvSubtitleRender::Private {
             QvRect(area.left() - margin, area.top() - margin, area.right() + margin, area.bottom() + margin));
     }
 
-    QvPoint placeOf(const QvFrame& frame, const QvSubtitle& subtitle, const DrawnLine& drawn,
-                    int offset) const {
+    QvPoint placeOf(const QvFrame& frame, const QvSubtitle& subtitle, const DrawnText& text,
+                    const DrawnLine& drawn, int offset) const {
         const int w = frame.width(), h = frame.height();
         const QvPoint& at = subtitle.position;
         if (at.x() >= 0 && at.x() <= w && at.y() >= -1 && at.y() <= h)
             return QvPoint(at.x(), at.y() + offset);
-        const double below = std::clamp(size * lineSpacing * subtitle.rows, -1e9, 1e9);
         const auto width = static_cast<int>(std::min(drawn.line.width, 1LL << 24));
+        const int lines = static_cast<int>(std::min<std::size_t>(text.lines.size(), farthest));
+        if (align != 0) {
+            const QvPoint corner = alignedAt(frame, text.align ? text.align : align, width, lines);
+            return QvPoint(corner.x(), corner.y() + offset);
+        }
+        const double below = std::clamp(size * lineSpacing * (wrap ? lines : subtitle.rows), -1e9, 1e9);
         return QvPoint(w / 2 - width / 2, offset - size / 2 - static_cast<int>(below) + h);
+    }
+
+    // The top left corner of the first of `lines` bands, if the line is `width` wide. What hangs below the
+    // last baseline takes a quarter of the size.
+    QvPoint alignedAt(const QvFrame& frame, int where, int width, int lines) const {
+        const int column = (where - 1) % 3, row = (where - 1) / 3;
+        const long long high = static_cast<long long>(lineHeight) * (lines - 1) + size + size / 4;
+        const long long freeX = frame.width() - width - 2LL * marginX,
+                        freeY = frame.height() - high - 2LL * marginY;
+        const long long x = marginX + freeX * column / 2, y = marginY + freeY * (2 - row) / 2;
+        return QvPoint(static_cast<int>(std::clamp<long long>(x, -farthest, farthest)),
+                       static_cast<int>(std::clamp<long long>(y, -farthest, farthest)));
+    }
+
+    int widestLine(const QvFrame& frame) const {
+        return wrap ? static_cast<int>(std::max(frame.width() - 2LL * marginX, 1LL)) : 0;
     }
 
     // Draws what of a line can be seen with its band at `place`, unless that has been drawn already.
@@ -244,6 +306,14 @@ int QvSubtitleRender::init(const QvTextRenderingOptions& options) {
     return p_->library.get() ? QvStatus::ok : QvStatus::failed;
 }
 
+std::u32string QvSubtitleRender::findFonts(const QvSubtitles& subtitles) {
+    if (!p_ || !p_->library.get()) return {};
+    FontFaces::Missing missing;
+    for (int i = 0; i < subtitles.nrSubtitles(); ++i) p_->collectMissing(*subtitles.at(i), missing);
+    p_->faces.find(missing);
+    return p_->faces.absent();
+}
+
 int QvSubtitleRender::render(QvFrame& frame, const QvSubtitle& subtitle, const QvColor* color) {
     QV_ASSERT(frame.inited());
     if (!p_ || !p_->library.get()) return QvStatus::ok;
@@ -254,12 +324,13 @@ int QvSubtitleRender::render(QvFrame& frame, const QvSubtitle& subtitle, const Q
                            subtitle.fieldMasks,
                            rgbOf(color),
                            frame.four_cc(),
-                           matrixOf(frame)};
+                           matrixOf(frame),
+                           p_->widestLine(frame)};
     DrawnText& drawn = p_->textOf(key);
     int offset = 0;
     for (DrawnLine& line : drawn.lines) {
         if (offset > farthest) break;
-        const QvPoint place = p_->placeOf(frame, subtitle, line, offset);
+        const QvPoint place = p_->placeOf(frame, subtitle, drawn, line, offset);
         if (p_->prepare(drawn, line, frame, place))
             blendAt(frame, place.x() + line.drawn.left(), place.y() + line.drawn.top(), line);
         offset += p_->lineHeight;

@@ -5,6 +5,7 @@
 #include <string>
 
 #include "core/arch/qvassert.h"
+#include "core/caption/subtitle/subtitlecopy_p.h"
 #include "core/caption/subtitle/subtitleparser_p.h"
 #include "core/caption/subtitle/subtitletext_p.h"
 #include "core/engine/files/qvfileutil.h"
@@ -26,11 +27,6 @@ int formatOf(const Any& filename) {
     if (ext == "sub") return QvSubtitles::SUB;
     qv_dbg()->error("Error: Unsupported subtitle format %s", ext.asString(""));
     return 0;
-}
-
-// Zeros inside are no text in an encoding of single bytes; padding at the end is.
-bool isText(std::string_view text) {
-    return text.find_first_not_of('\0', std::min(text.find('\0'), text.size())) == text.npos;
 }
 
 const char* encodingOfBytes(std::string_view text) {
@@ -83,7 +79,7 @@ void echo(std::string text) {
 
 // --- Reading.
 
-int QvSubtitles::parseFile(const Any& filename, const QvFramerate& rate) {
+int QvSubtitles::begin(const Any& filename, const QvFramerate& rate) {
     rate_ = rate;
     maxRows_ = 0;
     entries_.clear();
@@ -95,9 +91,13 @@ int QvSubtitles::parseFile(const Any& filename, const QvFramerate& rate) {
     const int format = formatOf(filename);
     if (format == 0) return QvStatus::failed;
     format_ = static_cast<Format>(format);
+    return QvStatus::ok;
+}
 
+int QvSubtitles::parseFile(const Any& filename, const QvFramerate& rate) {
     SubtitleBytes file;
-    if (file.read(filename) != QvStatus::ok) return QvStatus::failed;
+    if (begin(filename, rate) != QvStatus::ok || file.read(filename) != QvStatus::ok) return QvStatus::failed;
+    const Format format = format_;
     const SubtitleMark mark = findMark(file.view());
     encoding_ = static_cast<Encoding>(mark.encoding);
     if (encoding_ == markNone) unmarked_ = encodingOfBytes(file.view());
@@ -105,34 +105,62 @@ int QvSubtitles::parseFile(const Any& filename, const QvFramerate& rate) {
     int status = parse(subtitleText(file.view(), mark, false), bound);
     // The mark of the other byte order is honoured where this machine's order says nothing.
     if (entries_.empty() && (encoding_ == markUtf16be || encoding_ == markUtf32be)) {
-        format_ = static_cast<Format>(format);
+        format_ = format;
         status = parse(subtitleText(file.view(), mark, true), bound);
     }
     for (const auto& entry : entries_) maxRows_ = std::max(maxRows_, entry->rows);
     return status;
 }
 
+int QvSubtitles::readFile(const Any& filename, const QvFramerate& rate, int encoding,
+                          QvSubtitleFindings& findings) {
+    findings = QvSubtitleFindings();
+    SubtitleBytes file;
+    if (begin(filename, rate) != QvStatus::ok || file.read(filename) != QvStatus::ok) {
+        findings.problem = QvSubtitleFindings::unreadable;
+        return QvStatus::failed;
+    }
+    encoding_ = static_cast<Encoding>(findMark(file.view()).encoding);
+    unmarked_ = encoding_ == markNone ? "UTF-8" : "";
+    const SubtitleCopy copy(file.view(), encoding, format_ == SUB, findings);
+    format_ = copy.isSub ? SUB : SRT;
+    const auto taker = [this](ParsedSubtitle&& parsed) { take(std::move(parsed)); };
+    if (copy.normal.rate) rate_ = QvFramerate(*copy.normal.rate);
+    if (copy.isSub)
+        parseSub(copy.normal.text, rate_, taker);
+    else
+        parseSrt(copy.normal.text, taker);
+    for (const auto& entry : entries_) maxRows_ = std::max(maxRows_, entry->rows);
+    findings.hasRate = copy.normal.rate.has_value();
+    findings.lost = copy.normal.lost + copy.normal.entries - nrSubtitles();
+    if (entries_.empty() && findings.problem == QvSubtitleFindings::none)
+        findings.problem = QvSubtitleFindings::noSubtitles;
+    return entries_.empty() ? QvStatus::failed : QvStatus::ok;
+}
+
+void QvSubtitles::take(ParsedSubtitle&& parsed) {
+    auto entry = std::make_unique<QvSubtitle>();
+    entry->text = textValue(parsed.text);
+    entry->rows = 1 + static_cast<int>(std::count(parsed.text.begin(), parsed.text.end(), '|'));
+    entry->start = parsed.start;
+    entry->end = parsed.end;
+    subViewer_ |= parsed.subViewer;
+    entries_.push_back(std::move(entry));
+}
+
 int QvSubtitles::parse(std::string_view text, std::size_t bound) {
     unread_ = 0;
     if (!isText(text)) return QvStatus::failed;
-    const auto take = [this](ParsedSubtitle&& parsed) {
-        auto entry = std::make_unique<QvSubtitle>();
-        entry->text = textValue(parsed.text);
-        entry->rows = 1 + static_cast<int>(std::count(parsed.text.begin(), parsed.text.end(), '|'));
-        entry->start = parsed.start;
-        entry->end = parsed.end;
-        subViewer_ |= parsed.subViewer;
-        entries_.push_back(std::move(entry));
-    };
+    const auto taker = [this](ParsedSubtitle&& parsed) { take(std::move(parsed)); };
     const std::size_t beyond = text.size() - std::min(text.size(), bound);
     text.remove_suffix(beyond);
     unread_ = static_cast<long long>(beyond);
     if (format_ == SUB) {
-        const int status = parseSub(text, rate_, take);
+        const int status = parseSub(text, rate_, taker);
         if (!entries_.empty()) return status;
         format_ = SRT;
     }
-    unread_ += static_cast<long long>(parseSrt(text, take));
+    unread_ += static_cast<long long>(parseSrt(text, taker));
     return QvStatus::ok;
 }
 

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <memory>
+#include <string>
 #include <string_view>
 #include <vector>
 
@@ -9,6 +10,8 @@
 #include "core/measure/qvgeometry.h"
 #include "core/value/any.h"
 #include "core/value/anycontainer.h"
+
+struct ParsedSubtitle;
 
 // One entry: lines of text that are shown for a time.
 class QV_API QvSubtitle {
@@ -20,6 +23,25 @@ class QV_API QvSubtitle {
     MediaTime start;           // at the default timescale
     MediaTime end;             // the last instant at which it is shown
     AnyVector fieldMasks;  // Int32 for each character: bit 0 leaves out even picture lines, bit 1 odd ones
+};
+
+// What QvSubtitles::readFile found out about a file.
+struct QvSubtitleFindings {
+    enum Problem {
+        none,
+        unreadable,       // or of another extension
+        noText,           // binary
+        otherEncoding,    // not in the encoding that was asked for; read all the same, with U+FFFD
+        unknownEncoding,  // not known, and not found out
+        noSubtitles,
+    };
+    Problem problem = none;
+    std::string encoding;  // "UTF-8", "UTF-16LE", or a code page's name; with otherEncoding what it may be,
+                           // with unknownEncoding what it seems to be, each "" if nothing is known
+    bool guessed = false;  // neither the file nor the caller said so
+    long long line = 0;    // with otherEncoding: the first that is not in it
+    int lost = 0;          // entries whose times or frame numbers can't be read
+    bool hasRate = false;  // a MicroDVD file said its rate: rate() has it
 };
 
 // The subtitles of a file in its order. Pointers to entries are valid until the next parseFile.
@@ -43,6 +65,11 @@ class QV_API QvSubtitles {
     // 0, also for a file without any entry. -1: it can't be read, is no text, or has another extension, or a
     // SUB line is malformed; the entries before that line are kept.
     int parseFile(const Any& filename, const QvFramerate& rate);
+    // For files as people have them: parseFile on a copy of the text, in memory, that has been made UTF-8 and
+    // whose line ends, times, tags, and order are what parseFile expects. `encoding`: of QvText, for a file
+    // without a mark; 0: ASCII or UTF-8, and if it is neither, what its letters are most probably in.
+    // 0, or -1 if the file has no subtitles then.
+    int readFile(const Any& filename, const QvFramerate& rate, int encoding, QvSubtitleFindings& findings);
     // Writes all entries; a SUB file gets frame numbers at rate(). The lines are printed on the standard
     // output, too. -1 if the file can't be written completely.
     int saveToFile(const Any& filename, Format format) const;
@@ -80,6 +107,8 @@ class QV_API QvSubtitles {
     long long unread_ = 0;
     QvFramerate rate_;
 
+    int begin(const Any& filename, const QvFramerate& rate);
+    void take(ParsedSubtitle&& parsed);
     int parse(std::string_view text, std::size_t bound);
     bool hit(int index, const MediaTime& time);
     int search(const MediaTime& time);

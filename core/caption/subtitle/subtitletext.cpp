@@ -88,3 +88,7 @@ std::size_t subtitleBound(std::string_view bytes, const SubtitleMark& mark) {
     const std::size_t marks = hasUnits(mark) ? 2 * mark.size : mark.size;
     return bytes.size() > marks ? bytes.size() - marks : 0;
 }
+
+bool isText(std::string_view text) {
+    return text.find_first_not_of('\0', std::min(text.find('\0'), text.size())) == text.npos;
+}

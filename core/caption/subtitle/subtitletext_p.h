@@ -36,3 +36,6 @@ std::string subtitleText(std::string_view bytes, const SubtitleMark& mark, bool 
 
 // How much of such a text is read at most.
 std::size_t subtitleBound(std::string_view bytes, const SubtitleMark& mark);
+
+// Zeros inside are no text in an encoding of single bytes; padding at the end is.
+bool isText(std::string_view text);

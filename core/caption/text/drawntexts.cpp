@@ -4,7 +4,7 @@
 
 bool DrawnText::is(const DrawnTextKey& key) const {
     return encoding == key.encoding && rgb == key.rgb && fourcc == key.fourcc && matrix == key.matrix &&
-           text == key.text && fieldMasks == key.fieldMasks;
+           widest == key.widest && text == key.text && fieldMasks == key.fieldMasks;
 }
 
 DrawnText* DrawnTexts::find(const DrawnTextKey& key) {
@@ -25,6 +25,7 @@ DrawnText& DrawnTexts::renew(const DrawnTextKey& key) {
     text.rgb = key.rgb;
     text.fourcc = key.fourcc;
     text.matrix = key.matrix;
+    text.widest = key.widest;
     for (DrawnLine& line : text.lines) line.drawn = QvRect();
     return text;
 }

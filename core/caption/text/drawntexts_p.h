@@ -29,6 +29,7 @@ struct DrawnTextKey {
     unsigned rgb;  // 0xRRGGBB
     unsigned fourcc;
     QvYUVMatrix matrix;
+    int widest = 0;  // pixels of a line; 0: any width
 };
 
 struct DrawnText {
@@ -38,6 +39,8 @@ struct DrawnText {
     unsigned rgb = 0;
     unsigned fourcc = 0;
     QvYUVMatrix matrix = qvMatrixNotSet;
+    int widest = 0;
+    int align = 0;  // of a tag in the text
     std::deque<DrawnLine> lines;
 
     bool is(const DrawnTextKey& key) const;

@@ -73,12 +73,13 @@ FT_Stream openFont(const char* name) {
     return stream.release();
 }
 
-FT_Error openFace(FT_Library library, const char* name, FT_Face& face) {
+FT_Error openFace(FT_Library library, const char* name, int number, FT_Face& face) {
     if (!library) return FT_Err_Invalid_Library_Handle;
     FT_Open_Args source{};
     source.flags = FT_OPEN_STREAM;
     source.stream = openFont(name);
-    return source.stream ? FT_Open_Face(library, &source, 0, &face) : FT_Error(FT_Err_Cannot_Open_Resource);
+    return source.stream ? FT_Open_Face(library, &source, number, &face)
+                         : FT_Error(FT_Err_Cannot_Open_Resource);
 }
 
 }  // namespace
@@ -138,14 +139,14 @@ void FontLibrary::checkMemory() {
     if (std::exchange(ranOut_, false)) throw std::bad_alloc();
 }
 
-void FontFace::load(FontLibrary& library, const Any& file, int pixels, double pixelAspect) {
+void FontFace::load(FontLibrary& library, const Any& file, int pixels, double pixelAspect, int number) {
     glyphs_.clear();
     shaper_.reset();
     face_.reset();
     library_ = &library;
     const std::string name = qv_os_name(file);
     FT_Face face = nullptr;
-    const FT_Error error = openFace(library.get(), name.c_str(), face);
+    const FT_Error error = openFace(library.get(), name.c_str(), number, face);
     if (error != 0) {
         library.checkMemory();
         if (error == FT_Err_Unknown_File_Format)

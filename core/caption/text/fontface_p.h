@@ -58,8 +58,9 @@ class FontFace {
     static constexpr int largestSize = 4096;  // pixels; a letter of it covers the largest pictures
 
     // What fails is told in the debug log and leaves the face without glyphs. The library has to outlive it.
-    // `pixels`: the height of a letter; its width is divided by `pixelAspect`.
-    void load(FontLibrary& library, const Any& file, int pixels, double pixelAspect = 1);
+    // `pixels`: the height of a letter; its width is divided by `pixelAspect`. `number`: of the face in a
+    // file that holds several.
+    void load(FontLibrary& library, const Any& file, int pixels, double pixelAspect = 1, int number = 0);
     bool usable() const { return face_ != nullptr; }
 
     unsigned indexOf(char32_t character) const;  // 0 if the font does not have it

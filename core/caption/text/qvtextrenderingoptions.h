@@ -22,10 +22,17 @@ class QV_API QvTextRenderingOptions {
     int fontEffect = noEffect;  // Effect
     double pixelAspect = 1;     // width to height of the picture's pixels, 0.1 to 10: letters of a picture of
                                 // wide pixels are drawn narrow and come out right
+    Any fontFamily;             // invalid: none; goes before the files where the system has a font of it
+    bool wrap = false;          // lines that are wider than the picture, less the margins, become several
+    int align = 0;              // 0: centred, at a height that depends on the letters' size alone; 1 to 9: in
+                                // the picture less the margins, as on the keys of numbers (1 bottom left, 2
+                                // bottom, 9 top right); a "{\anN}" in the text goes before that
+    int marginX = 0;            // pixels on either side, with align or wrap
+    int marginY = 0;            // pixels above and below, with align
 
     // Sets "fontdir_regular", "fontdir_italic", "fontdir_bold", "charSizePt", "subEncoding", "codePage",
-    // "multibyteType", "fontEffect" and, unless it is 1, "pixelAspect"; other keys stay. Fonts that are not
-    // set are left out.
+    // "multibyteType", "fontEffect", "pixelAspect", "fontFamily", "wrap", "align", "marginX" and "marginY",
+    // the last six unless they have their defaults; other keys stay. Fonts that are not set are left out.
     void store(AnyDict& dict) const;
     // Takes the keys that are there with the right type; the other fields keep their values.
     void restore(const AnyDict& dict);

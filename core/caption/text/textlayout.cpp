@@ -1,79 +1,29 @@
-#include <algorithm>
-
 #include "core/caption/text/textlayout_p.h"
+
+#include <string>
+
+#include "core/caption/text/linewrap_p.h"
+#include "core/caption/text/styledtext_p.h"
 #include "core/caption/text/textshaping_p.h"
 
 namespace {
 
 constexpr long long firstPen = 64;  // a pixel of room for what hangs over to the left
 
-using View = std::u32string_view;
-
-constexpr struct {
-    View text;
-    FontStyle style;
-} styleTags[] = {
-    {U"<i>", FontStyle::italic},
-    {U"<b>", FontStyle::bold},
-    {U"</i>", FontStyle::regular},
-    {U"</b>", FontStyle::regular},
-};
-
-// What other players take for colours, places and lines under the text; it is nothing to be read.
-constexpr View plainTags[] = {U"<u>", U"</u>", U"<s>", U"</s>", U"<font>", U"</font>"};
-
-bool opensHiddenTag(View text) {
-    const bool code = text.size() > 2 && text[0] == U'{' && text[2] == U':' && (text[1] | 0x20) >= U'a' &&
-                      (text[1] | 0x20) <= U'z';  // "{y:i}" of SUB files
-    return code || text.starts_with(U"<font ") || text.starts_with(U"{\\");
-}
-
-// Characters of the tag that a text begins with, 0 without one.
-std::size_t tagAt(View text, FontStyle& style) {
-    if (text[0] != U'<' && text[0] != U'{') return 0;
-    for (const auto& tag : styleTags)
-        if (text.starts_with(tag.text)) {
-            style = tag.style;
-            return tag.text.size();
-        }
-    for (const View tag : plainTags)
-        if (text.starts_with(tag)) return tag.size();
-    if (!opensHiddenTag(text)) return 0;
-    return text.find(text[0] == U'<' ? U'>' : U'}') + 1;  // an open one is text
-}
-
-// Controls, and marks that only steer the layout; no font has a picture for them.
-bool isInvisible(char32_t c) {
-    return c < 0x20 || c == 0x7F || (c >= 0x200B && c <= 0x200F) || (c >= 0x202A && c <= 0x202E) ||
-           (c >= 0x2060 && c <= 0x2069) || c == 0xFEFF;
-}
-
-std::vector<StyledCharacter> withoutTags(View line, FontStyle& style) {
-    std::vector<StyledCharacter> text;
-    text.reserve(line.size());
-    for (std::size_t at = 0; at < line.size();) {
-        if (const std::size_t tag = tagAt(line.substr(at), style)) {
-            at += tag;
-            continue;
-        }
-        text.push_back({line[at], style, static_cast<int>(at)});
-        ++at;
-    }
-    return text;
-}
+using Characters = std::span<const StyledCharacter>;
 
 // One glyph for each character, side by side.
-void placeInOrder(std::span<const StyledCharacter> text, FontFaces& faces, TextLine& line) {
+void placeInOrder(Characters text, TextLine& line) {
     long long pen = firstPen;
     const FontFace* lastFace = nullptr;
     unsigned last = 0;
     for (const StyledCharacter& c : text) {
-        FontFace& face = faces[static_cast<std::size_t>(c.style)];
+        FontFace& face = *c.face;
         if (isInvisible(c.value) || !face.usable()) continue;
         const unsigned index = face.indexOf(c.value);
         if (lastFace == &face) pen += face.kerning(last, index);
         const int advance = face.glyph(index).advance;
-        line.glyphs.push_back({&face, index, pen, 0, c.index});
+        line.glyphs.push_back({&face, index, pen, 0, c.index, advance});
         pen += advance;
         line.width += advance / 64;
         lastFace = &face;
@@ -81,14 +31,51 @@ void placeInOrder(std::span<const StyledCharacter> text, FontFaces& faces, TextL
     }
 }
 
+// `paragraph`: the line that `text` is of, which says where it begins.
+TextLine place(Characters text, Characters paragraph) {
+    TextLine line;
+    if (needsShaping(paragraph))
+        line.width = (shape(text, paragraph, firstPen, line.glyphs) - firstPen) / 64;
+    else
+        placeInOrder(text, line);
+    return line;
+}
+
+std::vector<StyledCharacter> readLine(std::u32string_view text, FontFaces& faces, FontStyle& style) {
+    auto characters = withoutTags(text, style);
+    chooseFaces(characters, faces);
+    return characters;
+}
+
+// How far each character moves the pen, if the glyphs are those of the whole line.
+std::vector<long long> advancesOf(const TextLine& line, Characters text) {
+    std::vector<long long> byIndex(text.empty() ? 0 : static_cast<std::size_t>(text.back().index) + 1);
+    for (const PlacedGlyph& glyph : line.glyphs)
+        byIndex[static_cast<std::size_t>(glyph.character)] += glyph.advance;
+    std::vector<long long> advances;
+    for (const StyledCharacter& c : text) advances.push_back(byIndex[static_cast<std::size_t>(c.index)]);
+    return advances;
+}
+
 }  // namespace
 
-TextLine layOutLine(View text, FontFaces& faces, FontStyle& style) {
-    TextLine line;
-    const auto characters = withoutTags(text, style);
-    if (needsShaping(characters))
-        line.width = (shape(characters, faces, firstPen, line.glyphs) - firstPen) / 64;
-    else
-        placeInOrder(characters, faces, line);
-    return line;
+TextLine layOutLine(std::u32string_view text, FontFaces& faces, FontStyle& style) {
+    const auto characters = readLine(text, faces, style);
+    return place(characters, characters);
+}
+
+std::vector<TextLine> layOutLines(std::u32string_view text, FontFaces& faces, FontStyle& style,
+                                  long long widest) {
+    const auto characters = readLine(text, faces, style);
+    std::vector<TextLine> lines;
+    lines.push_back(place(characters, characters));
+    if (widest <= 0 || lines[0].width <= widest) return lines;
+    std::u32string values;
+    for (const StyledCharacter& c : characters) values += c.value;
+    const auto parts = wrapLine(values, advancesOf(lines[0], characters), widest * 64);
+    if (parts.size() < 2) return lines;
+    lines.clear();
+    for (const LinePart& part : parts)
+        lines.push_back(place(Characters(characters).subspan(part.begin, part.end - part.begin), characters));
+    return lines;
 }

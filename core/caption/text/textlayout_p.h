@@ -1,15 +1,10 @@
 // Lines of text as glyphs in their places.
 #pragma once
 
-#include <array>
 #include <string_view>
 #include <vector>
 
-#include "core/caption/text/fontface_p.h"
-
-enum class FontStyle { regular, italic, bold };
-
-using FontFaces = std::array<FontFace, 3>;  // in the order of FontStyle
+#include "core/caption/text/fontfaces_p.h"
 
 struct PlacedGlyph {
     FontFace* face;
@@ -17,6 +12,7 @@ struct PlacedGlyph {
     long long pen;  // 1/64 pixels from the start of the line's band
     int rise;       // 1/64 pixels above the baseline
     int character;  // index of its character in the line
+    int advance;    // 1/64 pixels to the pen of the next one
 };
 
 struct TextLine {
@@ -26,3 +22,6 @@ struct TextLine {
 
 // Lays out a line. Tags change `style`, which goes on to the next line, and are not drawn.
 TextLine layOutLine(std::u32string_view line, FontFaces& faces, FontStyle& style);
+// As several lines if it is wider than `widest` pixels; 0: as one.
+std::vector<TextLine> layOutLines(std::u32string_view line, FontFaces& faces, FontStyle& style,
+                                  long long widest);

@@ -1,6 +1,7 @@
 #include "core/caption/text/textshaping_p.h"
 
 #include <algorithm>
+#include <iterator>
 #include <memory>
 
 #include <fribidi.h>
@@ -13,20 +14,34 @@ struct Run {
     int begin;
     int end;
     FriBidiLevel level;  // odd: right to left
-    FontStyle style;
+    FontFace* face;
     hb_script_t script;
 
     bool rightToLeft() const { return level % 2 != 0; }
 };
 
-std::vector<FriBidiLevel> levelsOf(const std::vector<FriBidiChar>& text) {
+std::vector<FriBidiChar> valuesOf(std::span<const StyledCharacter> text) {
+    std::vector<FriBidiChar> characters;
+    for (const StyledCharacter& c : text) characters.push_back(c.value);
+    return characters;
+}
+
+// That of the first letter.
+FriBidiParType directionOf(std::span<const StyledCharacter> paragraph) {
+    const auto text = valuesOf(paragraph);
+    std::vector<FriBidiCharType> types(text.size());
+    const auto length = static_cast<FriBidiStrIndex>(text.size());
+    fribidi_get_bidi_types(text.data(), length, types.data());
+    return fribidi_get_par_direction(types.data(), length);
+}
+
+std::vector<FriBidiLevel> levelsOf(const std::vector<FriBidiChar>& text, FriBidiParType direction) {
     const auto length = static_cast<FriBidiStrIndex>(text.size());
     std::vector<FriBidiCharType> types(text.size());
     std::vector<FriBidiBracketType> brackets(text.size());
     std::vector<FriBidiLevel> levels(text.size());
     fribidi_get_bidi_types(text.data(), length, types.data());
     fribidi_get_bracket_types(text.data(), length, types.data(), brackets.data());
-    FriBidiParType direction = FRIBIDI_PAR_ON;  // that of the first letter
     if (fribidi_get_par_embedding_levels_ex(types.data(), brackets.data(), length, &direction,
                                             levels.data()) == 0)
         std::fill(levels.begin(), levels.end(), FriBidiLevel{0});
@@ -48,17 +63,16 @@ std::vector<hb_script_t> scriptsOf(const std::vector<FriBidiChar>& text) {
     return scripts;
 }
 
-std::vector<Run> runsOf(std::span<const StyledCharacter> text) {
-    std::vector<FriBidiChar> characters;
-    for (const StyledCharacter& c : text) characters.push_back(c.value);
-    const auto levels = levelsOf(characters);
+std::vector<Run> runsOf(std::span<const StyledCharacter> text, FriBidiParType direction) {
+    const auto characters = valuesOf(text);
+    const auto levels = levelsOf(characters, direction);
     const auto scripts = scriptsOf(characters);
     std::vector<Run> runs;
     for (std::size_t i = 0; i < text.size(); ++i) {
         const int at = static_cast<int>(i);
-        const Run next{at, at + 1, levels[i], text[i].style, scripts[i]};
+        const Run next{at, at + 1, levels[i], text[i].face, scripts[i]};
         const bool goesOn = !runs.empty() && runs.back().level == next.level &&
-                            runs.back().style == next.style && runs.back().script == next.script;
+                            runs.back().face == next.face && runs.back().script == next.script;
         if (goesOn)
             runs.back().end = next.end;
         else
@@ -81,13 +95,34 @@ void putInVisualOrder(std::vector<Run>& runs) {
     }
 }
 
+struct Range {
+    char32_t begin;
+    char32_t end;
+};
+constexpr Range shapedRanges[] = {
+    {0x300, 0x370},      // combining accents
+    {0x590, 0x1200},     // Hebrew and Arabic to Myanmar, Georgian, the parts of Hangul
+    {0x1700, 0x18B0},    // scripts of the Philippines, Khmer, Mongolian
+    {0x1900, 0x1D00},    // Limbu to Balinese, Lepcha and the signs of Vedic
+    {0x1DC0, 0x1E00},    // more accents
+    {0x20D0, 0x2100},    // accents of symbols
+    {0xA800, 0xAC00},    // Syloti Nagri to Meetei Mayek
+    {0xD7B0, 0xD800},    // more parts of Hangul
+    {0xFB1D, 0xFE00},    // Hebrew and Arabic presentation forms
+    {0xFE20, 0xFE30},    // half accents
+    {0xFE70, 0xFEFF},    // Arabic presentation forms
+    {0x10800, 0x12000},  // historic scripts from right to left, scripts of India
+    {0x16B00, 0x16B90},  // Pahawh Hmong
+    {0x1E800, 0x1F000},  // Adlam and others from right to left
+};
+
 struct BufferDone {
     void operator()(hb_buffer_t* buffer) const { hb_buffer_destroy(buffer); }
 };
 using Buffer = std::unique_ptr<hb_buffer_t, BufferDone>;
 
-long long placeRun(const Run& run, std::span<const StyledCharacter> text, FontFace& face, hb_buffer_t* buffer,
-                   long long pen, std::vector<PlacedGlyph>& glyphs) {
+long long placeRun(const Run& run, std::span<const StyledCharacter> text, hb_buffer_t* buffer, long long pen,
+                   std::vector<PlacedGlyph>& glyphs) {
     hb_buffer_clear_contents(buffer);
     for (int i = run.begin; i < run.end; ++i) {
         const StyledCharacter& c = text[static_cast<std::size_t>(i)];
@@ -97,13 +132,13 @@ long long placeRun(const Run& run, std::span<const StyledCharacter> text, FontFa
     hb_buffer_set_direction(buffer, run.rightToLeft() ? HB_DIRECTION_RTL : HB_DIRECTION_LTR);
     hb_buffer_set_script(buffer, run.script);
     hb_buffer_guess_segment_properties(buffer);
-    hb_shape(face.shaper(), buffer, nullptr, 0);
+    hb_shape(run.face->shaper(), buffer, nullptr, 0);
     unsigned count = 0;
     const hb_glyph_info_t* infos = hb_buffer_get_glyph_infos(buffer, &count);
     const hb_glyph_position_t* places = hb_buffer_get_glyph_positions(buffer, &count);
     for (unsigned i = 0; i < count; ++i) {
-        glyphs.push_back({&face, infos[i].codepoint, pen + places[i].x_offset, places[i].y_offset,
-                          static_cast<int>(infos[i].cluster)});
+        glyphs.push_back({run.face, infos[i].codepoint, pen + places[i].x_offset, places[i].y_offset,
+                          static_cast<int>(infos[i].cluster), places[i].x_advance});
         pen += places[i].x_advance;
     }
     return pen;
@@ -113,23 +148,19 @@ long long placeRun(const Run& run, std::span<const StyledCharacter> text, FontFa
 
 bool needsShaping(std::span<const StyledCharacter> text) {
     return std::any_of(text.begin(), text.end(), [](const StyledCharacter& c) {
-        const char32_t v = c.value;
-        return (v >= 0x300 && v < 0x370) ||    // combining accents
-               (v >= 0x590 && v < 0x10A0) ||   // Hebrew and Arabic to Myanmar
-               (v >= 0x1780 && v < 0x18B0) ||  // Khmer, Mongolian
-               (v >= 0xFB1D && v < 0xFE00) ||  // Hebrew and Arabic presentation forms
-               (v >= 0xFE70 && v < 0xFEFF);
+        const auto* const row =
+            std::upper_bound(std::begin(shapedRanges), std::end(shapedRanges), c.value,
+                             [](char32_t value, const Range& range) { return value < range.end; });
+        return row != std::end(shapedRanges) && c.value >= row->begin;
     });
 }
 
-long long shape(std::span<const StyledCharacter> text, FontFaces& faces, long long pen,
-                std::vector<PlacedGlyph>& glyphs) {
-    auto runs = runsOf(text);
+long long shape(std::span<const StyledCharacter> text, std::span<const StyledCharacter> paragraph,
+                long long pen, std::vector<PlacedGlyph>& glyphs) {
+    auto runs = runsOf(text, directionOf(paragraph));
     putInVisualOrder(runs);
     const Buffer buffer(hb_buffer_create());
-    for (const Run& run : runs) {
-        FontFace& face = faces[static_cast<std::size_t>(run.style)];
-        if (face.usable()) pen = placeRun(run, text, face, buffer.get(), pen, glyphs);
-    }
+    for (const Run& run : runs)
+        if (run.face->usable()) pen = placeRun(run, text, buffer.get(), pen, glyphs);
     return pen;
 }

@@ -96,6 +96,16 @@ Any QvRegistry::defaultFontFileBold(int monospace) const {
     return fontFile(faceFor(monospace, QvFontFace::sansBold));
 }
 
+bool QvRegistry::hasFontFamily(const char* family) const {
+    return family && *family && !qv_platform().fontOf(family, QvFontFace::sans).name.empty();
+}
+
+AnyVector QvRegistry::fontFamilies() const {
+    AnyVector names;
+    for (const std::string& family : qv_platform().fontFamilies()) names.append(family.c_str());
+    return names;
+}
+
 QvPresetMgr* QvRegistry::presetMgr() const { return p_->presets.get(); }
 void QvRegistry::installLogger(QvLogBase* logger) { qv_dbg()->setLogger(logger); }
 QvLogBase* QvRegistry::logger() const { return qv_dbg()->logger(); }

@@ -52,6 +52,10 @@ class QV_API QvRegistry {
     Any defaultFontFile(int monospace) const;
     Any defaultFontFileItalic(int monospace) const;
     Any defaultFontFileBold(int monospace) const;
+    // Whether text can be drawn in a font family of this name, and the names of those installed (Strings,
+    // sorted).
+    bool hasFontFamily(const char* family) const;
+    AnyVector fontFamilies() const;
     QvPresetMgr* presetMgr() const;
     void installLogger(QvLogBase* logger);  // borrowed; null stops the calls
     QvLogBase* logger() const;
