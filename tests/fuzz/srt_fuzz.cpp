@@ -34,6 +34,20 @@ void checkSaved(QvSubtitles& subtitles) {
     }
 }
 
+// As the tool reads it: the same bytes give text, or a reason why not; nothing is lost in between.
+void checkReading(const MemoryFile& file) {
+    for (const int encoding : {0, 1, 1251}) {
+        QvSubtitles subtitles;
+        QvSubtitleFindings findings;
+        const int status = subtitles.readFile(file.name(), rate, encoding, findings);
+        require((status == 0) == (subtitles.nrSubtitles() > 0));
+        require(status == 0 || findings.problem != QvSubtitleFindings::none);
+        require(findings.lost >= 0);
+        for (int i = 1; i < subtitles.nrSubtitles(); ++i)
+            require(subtitles.at(i - 1)->start <= subtitles.at(i)->start);
+    }
+}
+
 }  // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
@@ -51,5 +65,6 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     }
     if (status == 0 && canBeReadAgain(subtitles)) checkSaved(subtitles);
     subtitles.changeFramerate(QvFramerate(29.97));
+    checkReading(file);
     return 0;
 }

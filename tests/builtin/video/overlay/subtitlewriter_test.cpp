@@ -86,6 +86,26 @@ TEST_F(Subtitle, LooksAsItsParametersSay) {
     EXPECT_TRUE(log.contains("The font /nowhere.ttf can't be read"));
 }
 
+TEST_F(Subtitle, LettersWithoutAFontAreNamedOnce) {
+    file_ = folder_.write("talk.srt",
+                          "1\n00:00:01,000 --> 00:00:02,000\n\xF4\x8F\xBF\xBD\xF4\x8F\xBF\xBD\n\n"
+                          "2\n00:00:03,000 --> 00:00:04,000\n\xF4\x8F\xBF\xBD Hello\n");
+    const LogCapture log;
+    EXPECT_TRUE(shows(30));
+    EXPECT_TRUE(log.contains("no font of this system has U+10FFFD", 4));
+}
+
+TEST_F(Subtitle, AFileOfAnyOriginIsReadIfAsked) {
+    file_ = folder_.write("talk.sub", "{1}{1}50\n{100}{150}Hello\n");
+    const Params normal{{"normalize", 1}};
+    EXPECT_TRUE(shows(50, normal) && shows(75, normal)) << "at the rate of the file";
+    EXPECT_FALSE(shows(49, normal) || shows(76, normal));
+    const Params at25{{"normalize", 1}, {"framerate", QvFramerate(QvRatio(25, 1))}};
+    EXPECT_TRUE(shows(100, at25) && !shows(99, at25)) << "unless another is given";
+    file_ = folder_.write("none.srt", "no times");
+    EXPECT_FALSE(shows(30, normal));
+}
+
 TEST_F(Subtitle, FilesWithoutSubtitles) {
     for (const std::string& name :
          {folder_.file("gone.srt"), folder_.write("talk.txt", srt), folder_.file("")}) {

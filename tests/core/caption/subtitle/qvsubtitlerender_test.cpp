@@ -86,6 +86,40 @@ TEST_F(Render, LinesStandAboveTheLowerEdgeOrAtAPosition) {
     EXPECT_NEAR(inked().left(), 104, 4);
 }
 
+// Within the margins on every side and in every corner, however many lines there are.
+TEST_F(Render, AlignedTextStaysWithinItsMargins) {
+    clear(320, 240);
+    options.charSize = 20;
+    options.wrap = true;
+    options.marginX = 32;
+    options.marginY = 24;
+    const QvRect inner(32, 24, 320 - 32, 240 - 24);
+    const auto drawn = [&](const char* text, int align) {
+        options.align = align;
+        picture(text);
+        return inked();
+    };
+    for (int align = 1; align <= 9; ++align)
+        for (const char* text : {"Hg", "gH|g", "a line of text that is far wider than this picture is"}) {
+            const QvRect ink = drawn(text, align);
+            EXPECT_TRUE(ink.left() >= inner.left() && ink.right() <= inner.right() + 1) << align << text;
+            EXPECT_TRUE(ink.top() >= inner.top() && ink.bottom() <= inner.bottom()) << align << text;
+            if (align % 3 == 1) {
+                EXPECT_LE(ink.left(), inner.left() + 4) << align;
+            }
+            if (align % 3 == 0) {
+                EXPECT_GE(ink.right(), inner.right() - 4) << align;
+            }
+            if (align <= 3) {
+                EXPECT_GE(ink.bottom(), inner.bottom() - 4) << align << text;
+            }
+            if (align >= 7) {
+                EXPECT_LE(ink.top(), inner.top() + 10) << align << text;
+            }
+        }
+    EXPECT_EQ(drawn("{\\an8}Hg", 2).top(), drawn("Hg", 8).top());
+}
+
 TEST_F(Render, TagsChooseTheFaceAndAreNotDrawn) {
     const std::size_t plain = picture("H"), blank = picture("");
     options.fontBold = "/nowhere.ttf";

@@ -61,6 +61,65 @@ TEST_F(Layout, CharactersStandInTheirOrder) {
     EXPECT_EQ(glyphs[0].glyph, faces[0].indexOf(U'(')) << "brackets are mirrored";
 }
 
+// Letters that the face lacks come from a font that has them; a letter and its marks from one font.
+TEST_F(Layout, LettersOfOtherFonts) {
+    faces.fallBack(library, 40, 1);
+    const struct {
+        const char* what;
+        std::u32string_view text;
+    } rows[] = {{"Thai", U"a\u0E17\u0E35\u0E48"},
+                {"Devanagari", U"a\u0915\u094D\u0924\u093F"},
+                {"Han", U"a\u65E5\u672C"},
+                {"Hangul", U"a\uD55C\uAE00"}};
+    for (const auto& row : rows) {
+        if (qv_platform().fontsWith(row.text.substr(1), QvFontFace::sans).size() != 1) continue;
+        const auto glyphs = lay(row.text).glyphs;
+        ASSERT_GE(glyphs.size(), 2u) << row.what;
+        EXPECT_EQ(glyphs[0].face, &faces[0]) << row.what;
+        for (std::size_t i = 1; i < glyphs.size(); ++i) {
+            EXPECT_EQ(glyphs[i].face, glyphs[1].face) << row.what;
+            EXPECT_NE(glyphs[i].face, &faces[0]) << row.what;
+            EXPECT_NE(glyphs[i].glyph, 0u) << row.what;
+        }
+        EXPECT_EQ(faces.absent(), U"") << row.what;
+    }
+    // A letter for private use is in none; the others of its line are drawn all the same.
+    EXPECT_EQ(lay(U"a\U0010FFFDb\U0010FFFD").glyphs.size(), 4u);
+    EXPECT_EQ(faces.absent(), U"\U0010FFFD");
+    EXPECT_EQ(lay(U"e\u0302\u0301").glyphs[0].face, &faces[0]) << "composed, the face has it";
+}
+
+TEST_F(Layout, WideLinesAreBrokenEvenly) {
+    const auto widths = [&](std::u32string_view text, long long widest) {
+        FontStyle style = FontStyle::regular;
+        std::vector<long long> found;
+        for (const TextLine& line : layOutLines(text, faces, style, widest)) {
+            EXPECT_TRUE(line.width <= widest || widest == 1);
+            found.push_back(line.width);
+        }
+        return found;
+    };
+    const long long word = lay(U"nnnn").width, space = lay(U" ").width;
+    EXPECT_EQ(widths(U"nnnn nnnn nnnn nnnn", 4 * word + 3 * space).size(), 1u);
+    EXPECT_EQ(widths(U"nnnn nnnn nnnn nnnn", 4 * word), (std::vector{2 * word + space, 2 * word + space}));
+    EXPECT_EQ(widths(U"nnnn nnnn nnnn", 2 * word + space).size(), 2u);
+    EXPECT_EQ(widths(U"nnnnnnnn", word), (std::vector{word, word})) << "a word without a place to break";
+    EXPECT_EQ(widths(U"nnnn\u00A0nnnn nnnn", 2 * word + space)[0], 2 * word + space) << "a space that holds";
+    EXPECT_EQ(widths(U"nn", 1).size(), 2u);
+    EXPECT_EQ(widths(U"", 1).size(), 1u);
+    EXPECT_EQ(widths(U"    ", 1).size(), 1u);
+    // Each part of a line of Arabic is read from the right, also one that begins with Latin letters.
+    FontStyle style = FontStyle::regular;
+    const std::u32string_view arabic = U"\u0628\u0628\u0628\u0628\u0628\u0628\u0628\u0628 abc \u0628";
+    const auto lines = layOutLines(arabic, faces, style, lay(arabic).width * 3 / 5);
+    ASSERT_EQ(lines.size(), 2u);
+    EXPECT_EQ(lines[1].glyphs.front().character, 13);
+    EXPECT_EQ(lines[1].glyphs.back().character, 11);
+    EXPECT_EQ(style, FontStyle::regular);
+    layOutLines(U"nnnn <i>nnnn nnnn", faces, style, word);
+    EXPECT_EQ(style, FontStyle::italic);
+}
+
 TEST(TextMask, OutlinesOfOneDotAndOfMore) {
     const auto outlined = [](int radius) {
         QvFrame letters, mask;
