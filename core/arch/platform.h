@@ -174,15 +174,16 @@ class QV_API QvPlatform {
     // U+FFFD, a byte each. False if the system does not know the code page.
     virtual bool decodeCodepage(int number, std::string_view bytes, std::u32string& text);
     virtual std::string fontFile(QvFontFace face);  // full name, empty if the system has no font at all
-    // Fonts that together have as many of the letters as the system's fonts can draw, nearest to `like` first.
+    // Fonts that together have as many of the letters as the system's fonts can draw, nearest to `like`
+    // first.
     virtual std::vector<QvFontFile> fontsWith(std::u32string_view letters, QvFontFace like);
     // The font of an installed family, or of one that the system takes in its place, with the weight and the
     // slant of `like`. The name is empty if there is none.
     virtual QvFontFile fontOf(const std::string& family, QvFontFace like);
     virtual std::vector<std::string> fontFamilies();  // sorted
-    virtual std::string cpuFeatures();              // "MMX SSE2 ...", in a fixed order
-    virtual std::string platformName();             // "Linux x64"
-    virtual std::uint32_t randomBits();             // from the system's entropy: two processes do not meet
+    virtual std::string cpuFeatures();                // "MMX SSE2 ...", in a fixed order
+    virtual std::string platformName();               // "Linux x64"
+    virtual std::uint32_t randomBits();               // from the system's entropy: two processes do not meet
 
     // `name` as one word of a shell command: no character in it can act, and no leading "-" makes an option
     // of it.
