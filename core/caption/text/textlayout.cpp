@@ -31,10 +31,10 @@ void placeInOrder(Characters text, TextLine& line) {
     }
 }
 
-// `paragraph`: the line that `text` is of, which says where it begins.
-TextLine place(Characters text, Characters paragraph) {
+// `paragraph`: the line that `text` is of.
+TextLine place(Characters text, const Paragraph& paragraph) {
     TextLine line;
-    if (needsShaping(paragraph))
+    if (paragraph.shaped)
         line.width = (shape(text, paragraph, firstPen, line.glyphs) - firstPen) / 64;
     else
         placeInOrder(text, line);
@@ -61,14 +61,15 @@ std::vector<long long> advancesOf(const TextLine& line, Characters text) {
 
 TextLine layOutLine(std::u32string_view text, FontFaces& faces, FontStyle& style) {
     const auto characters = readLine(text, faces, style);
-    return place(characters, characters);
+    return place(characters, paragraphOf(characters));
 }
 
 std::vector<TextLine> layOutLines(std::u32string_view text, FontFaces& faces, FontStyle& style,
                                   long long widest) {
     const auto characters = readLine(text, faces, style);
     std::vector<TextLine> lines;
-    lines.push_back(place(characters, characters));
+    const Paragraph paragraph = paragraphOf(characters);
+    lines.push_back(place(characters, paragraph));
     if (widest <= 0 || lines[0].width <= widest) return lines;
     std::u32string values;
     for (const StyledCharacter& c : characters) values += c.value;
@@ -76,6 +77,6 @@ std::vector<TextLine> layOutLines(std::u32string_view text, FontFaces& faces, Fo
     if (parts.size() < 2) return lines;
     lines.clear();
     for (const LinePart& part : parts)
-        lines.push_back(place(Characters(characters).subspan(part.begin, part.end - part.begin), characters));
+        lines.push_back(place(Characters(characters).subspan(part.begin, part.end - part.begin), paragraph));
     return lines;
 }

@@ -144,8 +144,6 @@ long long placeRun(const Run& run, std::span<const StyledCharacter> text, hb_buf
     return pen;
 }
 
-}  // namespace
-
 bool needsShaping(std::span<const StyledCharacter> text) {
     return std::any_of(text.begin(), text.end(), [](const StyledCharacter& c) {
         const auto* const row =
@@ -155,9 +153,16 @@ bool needsShaping(std::span<const StyledCharacter> text) {
     });
 }
 
-long long shape(std::span<const StyledCharacter> text, std::span<const StyledCharacter> paragraph,
-                long long pen, std::vector<PlacedGlyph>& glyphs) {
-    auto runs = runsOf(text, directionOf(paragraph));
+}  // namespace
+
+Paragraph paragraphOf(std::span<const StyledCharacter> text) {
+    const bool shaped = needsShaping(text);
+    return {shaped, static_cast<unsigned>(shaped ? directionOf(text) : FRIBIDI_PAR_ON)};
+}
+
+long long shape(std::span<const StyledCharacter> text, const Paragraph& paragraph, long long pen,
+                std::vector<PlacedGlyph>& glyphs) {
+    auto runs = runsOf(text, static_cast<FriBidiParType>(paragraph.direction));
     putInVisualOrder(runs);
     const Buffer buffer(hb_buffer_create());
     for (const Run& run : runs)
