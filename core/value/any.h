@@ -117,7 +117,8 @@ class QV_API Any {
     Any(const QvRect& value) { set(value); }
 
     // Assignment. Storage is reused where the type stays the same: a container and an object keep their
-    // address, a text its buffer if the new one is not longer. The source may lie inside this value.
+    // address, a text its buffer if the new one is not longer. The source may lie inside this value. The
+    // other way round it must be copied: a value can't be moved into a part of itself.
     void set(int value) { setPlain(Any(value)); }
     void set(long long value) { setPlain(Any(value)); }
     void set(long value) { setPlain(Any(value)); }
@@ -307,10 +308,16 @@ class QV_API Any {
         size_ = other.type_ == Invalid ? 0 : other.size_;  // the marker does not travel
         type_ = other.type_;
     }
+    // `plain` may be a part of what is released, so it is read first.
     void setPlain(const Any& plain) {
         if (isNull()) failNull();
+        const std::uint64_t bits = plain.bits_;
+        const int type = plain.type_;
+        const int size = type == Invalid ? 0 : plain.size_;
         if (ownsStorage()) release();
-        takePlain(plain);
+        bits_ = bits;
+        size_ = size;
+        type_ = type;
     }
 
     [[noreturn]] static void failNull();

@@ -179,7 +179,10 @@ Any& AnyDict::set(const char* key, const Any& value) {
     if (value.isDict() || value.isVector()) return set(key, Any(value));
     return slot(key) = value;
 }
-Any& AnyDict::set(const char* key, Any&& value) { return slot(key) = std::move(value); }
+Any& AnyDict::set(const char* key, Any&& value) {
+    if (value.isDict() && &value.asDict() == this) return set(key, Any(std::as_const(value)));
+    return slot(key) = std::move(value);
+}
 Any& AnyDict::set(const char* key, const AnyDict& value) { return set(key, Any(value)); }
 Any& AnyDict::set(const char* key, AnyDict&& value) { return set(key, Any(std::move(value))); }
 Any& AnyDict::set(const char* key, const AnyVector& value) { return set(key, Any(value)); }
@@ -239,8 +242,9 @@ const Any& AnyDict::getVal(int position) const { return *getEntry(position).valu
 void AnyDict::getKeyVal(int position, Any& key, Any& value) const {
     const Entry entry = getEntry(position);
     if (entry.key) {
+        Any copy(*entry.value);  // `key` may be the value that holds this dictionary
         key = entry.key;
-        value = *entry.value;
+        value = std::move(copy);
     } else {
         key.invalidate();
         value.invalidate();

@@ -111,7 +111,10 @@ void AnyVector::set(int index, const Any& value) {
 }
 
 Any& AnyVector::append(const Any& value) { return append(Any(value)); }
-Any& AnyVector::append(Any&& value) { return writable().append(std::make_unique<Any>(std::move(value))); }
+Any& AnyVector::append(Any&& value) {
+    if (value.isVector() && &value.asVector() == this) return append(Any(std::as_const(value)));
+    return writable().append(std::make_unique<Any>(std::move(value)));
+}
 AnyDict& AnyVector::append(const AnyDict& value) { return append(Any(value)).asDict(); }
 AnyDict& AnyVector::append(AnyDict&& value) { return append(Any(std::move(value))).asDict(); }
 AnyVector& AnyVector::append(const AnyVector& value) { return append(Any(value)).asVector(); }

@@ -1,5 +1,6 @@
 #include <limits>
 
+#include "core/measure/qvgeometry.h"
 #include "tests/support/checks.h"
 
 namespace {
@@ -173,6 +174,75 @@ TEST(AnyDict, valuesMayHoldTheDictionaryOrComeFromIt) {
     outer.set("in", AnyDict("x", 1));
     outer = outer["in"].asDict();
     EXPECT_EQ(outer, AnyDict("x", 1));
+}
+
+// Whatever the type of a part is, it may be copied or moved over the whole, or over what is between.
+TEST(AnyContainers, aPartMayReplaceWhatHoldsIt) {
+    const int framerate = 25;
+    const Any parts[] = {Any(),
+                         7,
+                         7LL,
+                         0.5,
+                         "text",
+                         Any("wide").toWString(),
+                         AnyDict("a", "b"),
+                         AnyVector(1, "two"),
+                         Any(&framerate, 4),
+                         Any(static_cast<const void*>(&framerate)),
+                         QvFramerate(QvRatio(25, 1)),
+                         QvPoint(1, 2),
+                         QvRect(1, 2, 3, 4),
+                         Pair(1, 2),
+                         MediaTime(1, 25)};
+    for (const Any& part : parts) {
+        const auto nested = [&] { return Any(AnyVector(1, AnyDict("k", AnyVector("x", part)))); };
+        const auto innermost = [](Any& value) -> Any& { return *value.asVector().descendant("1.k.1"); };
+        Any copied = nested(), moved = nested();
+        copied = innermost(copied);
+        moved = std::move(innermost(moved));
+        EXPECT_EQ(copied, part) << part.type();
+        EXPECT_EQ(moved, part) << part.type();
+
+        Any inDict = nested(), inVector = nested();
+        AnyDict& dict = inDict.asVector()[1].asDict();
+        EXPECT_EQ(dict.set("k", dict["k"].asVector()[1]), part) << part.type();
+        inVector.asVector().set(1, innermost(inVector));
+        EXPECT_EQ(inVector, Any(AnyVector(1, part))) << part.type();
+        inVector.asVector().insert(inVector.asVector()[1], 0);
+        EXPECT_EQ(inVector, Any(AnyVector(part, 1, part))) << part.type();
+    }
+}
+
+TEST(AnyContainers, mayBePutIntoThemselves) {
+    Any list(AnyVector(1, 2));
+    list.asVector().append(std::move(list));
+    EXPECT_EQ(list, Any(AnyVector(1, 2, AnyVector(1, 2))));
+    list.asVector().insert(list, 1);
+    EXPECT_EQ(list.asVector()[1], Any(AnyVector(1, 2, AnyVector(1, 2))));
+    list.asVector().removeMany(list.asVector()[1].asVector()[2].asVector());
+    EXPECT_EQ(list, Any(AnyVector(1, AnyVector(1, 2))));
+    list.asVector()[1] = list;
+    EXPECT_EQ(list, Any(AnyVector(1, AnyVector(1, AnyVector(1, 2)))));
+    for (int i = 0; i < 100; ++i) list.asVector().append(list.asVector()[0]);  // while it grows
+    EXPECT_EQ(list.asVector().back(), 1);
+
+    Any whole(AnyDict("a", 1, "name", "b"));
+    AnyDict& dict = whole.asDict();
+    dict.set("whole", std::move(whole));
+    EXPECT_EQ(whole, Any(AnyDict("a", 1, "name", "b", "whole", AnyDict("a", 1, "name", "b"))));
+    dict["whole"] = whole;
+    EXPECT_EQ(dict.descendant("whole.whole.a")->asInt32(), 1);
+    dict.set(dict["name"].asString(), dict["name"]);  // the key of the entry is text of an entry
+    dict.set(dict["name"].asString(), std::move(dict["name"]));
+    EXPECT_EQ(dict["b"], "b");
+    dict.remove(dict.getKey(0));
+    EXPECT_FALSE(dict.isSet("a"));
+    Any value;
+    dict.getKeyVal(0, whole, value);
+    EXPECT_TRUE(whole == "b" && value == "b");
+    value = AnyVector("a", "b");
+    value = value.asVector().join(value.asVector()[1]);
+    EXPECT_EQ(value, "abb");
 }
 
 TEST(AnyContainers, nullSentinelsAreNeverWritten) {
