@@ -51,8 +51,8 @@ bool readLine(std::FILE* file, Line& line) {
 // The state of one reading.
 class Reading {
   public:
-    Reading(AnyVector& errors, AnyVector& sections, AnyVector& items)
-        : errors_(errors), sections_(sections), items_(items) {}
+    Reading(AnyVector& errors, AnyVector& sections, std::vector<std::size_t>& starts, std::string& items)
+        : errors_(errors), sections_(sections), starts_(starts), items_(items) {}
 
     int run(std::FILE* file) {
         constexpr std::string_view byteOrderMark = "\xEF\xBB\xBF";
@@ -64,7 +64,6 @@ class Reading {
             take(trimmed(line.text, " \t\r\n"));
         }
         if (std::ferror(file)) refuse("read failed", QvStatus::cannotParse);
-        closeSection();
         return status_;
     }
 
@@ -78,16 +77,15 @@ class Reading {
         }
         if (line.find('\0') != line.npos) return refuse("can't parse line");
         if (line.front() == '[') return takeSection(line);
-        if (!inSection_) return refuse("data outside section");
+        if (starts_.empty()) return refuse("data outside section");
         takePair(line);
     }
 
     void takeSection(std::string_view line) {
         const std::size_t end = line.find(']');
         if (end == line.npos || end == 1) return refuse("unterminated or empty section");
-        closeSection();
-        inSection_ = true;
-        name_ = line.substr(1, end - 1);
+        starts_.push_back(items_.size());
+        sections_.append(textOf(line.substr(1, end - 1)));
     }
 
     void takePair(std::string_view line) {
@@ -97,7 +95,8 @@ class Reading {
         const std::string_view value = trimmed(line.substr(separator + 1));
         if (key.empty()) return refuse("key too short");
         if (value.empty()) return refuse("value too short");
-        pairs_.append(AnyVector(textOf(key), textOf(value)));
+        items_.append(key).push_back('\0');
+        items_.append(value).push_back('\0');
     }
 
     static std::size_t separatorOf(std::string_view line) {
@@ -105,15 +104,11 @@ class Reading {
         return equals != line.npos ? equals : line.find(':');
     }
 
-    void closeSection() {
-        if (!inSection_) return;
-        sections_.append(textOf(name_));
-        items_.append(pairs_);
-        pairs_.clear();
-        inSection_ = false;
+    void report(const char* what) {
+        if (errors_.size() == QvIniParser::maxErrors) what = "further messages are left out";
+        if (errors_.size() <= QvIniParser::maxErrors)
+            errors_.append(Any::sprintf("line %d: %s", number_, what));
     }
-
-    void report(const char* what) { errors_.append(Any::sprintf("line %d: %s", number_, what)); }
     void refuse(const char* what, int status = QvStatus::noSegment) {
         report(what);
         status_ = status;
@@ -121,10 +116,8 @@ class Reading {
 
     AnyVector& errors_;
     AnyVector& sections_;
-    AnyVector& items_;
-    AnyVector pairs_;
-    std::string name_;
-    bool inSection_ = false;
+    std::vector<std::size_t>& starts_;
+    std::string& items_;
     int number_ = 1;
     int status_ = QvStatus::ok;
 };
@@ -134,11 +127,12 @@ class Reading {
 int QvIniParser::load(const Any& name, AnyVector* errors) {
     errors_.clear();
     sections_.clear();
+    starts_.clear();
     items_.clear();
     int result = QvStatus::cannotParse;
     const File file(static_cast<std::FILE*>(name.isText() ? qvfopen(name, "r") : nullptr));
     if (file)
-        result = Reading(errors_, sections_, items_).run(file.get());
+        result = Reading(errors_, sections_, starts_, items_).run(file.get());
     else
         errors_.append(Any("Failed to open file"));
     if (errors) *errors = errors_;
@@ -147,28 +141,45 @@ int QvIniParser::load(const Any& name, AnyVector* errors) {
 
 Any QvIniParser::section(int index) const { return sections_.at(index); }
 
-int QvIniParser::getSectionItems(const char* section, AnyDict* items) const {
-    items->clear();
-    constexpr std::size_t longestKey = 40;
-    int result = -1;
+// Calls visit(key, value) for each item of the sections of this name, until it returns true. False if there
+// is no such section.
+template <class Visit>
+bool QvIniParser::visitItems(const char* section, Visit visit) const {
+    bool found = false;
     for (int i = 0; i < sections_.size(); ++i) {
         if (!(sections_.at(i) == section)) continue;
-        result = 0;
-        for (const Any& pair : items_.at(i).asVector()) {
-            const std::string key = std::string(pair.asVector().at(0).asString()).substr(0, longestKey);
-            if (!items->isSet(key.c_str())) items->set(key.c_str(), pair.asVector().at(1));
+        found = true;
+        const auto place = static_cast<std::size_t>(i);
+        const char* key = items_.data() + starts_[place];
+        const char* const end =
+            items_.data() + (place + 1 < starts_.size() ? starts_[place + 1] : items_.size());
+        while (key < end) {
+            const char* const value = key + std::strlen(key) + 1;
+            if (visit(key, value)) return true;
+            key = value + std::strlen(value) + 1;
         }
     }
-    return result;
+    return found;
+}
+
+int QvIniParser::getSectionItems(const char* section, AnyDict* items) const {
+    items->clear();
+    const bool found = visitItems(section, [items](const char* text, const char* value) {
+        const std::string key = std::string(text).substr(0, AnyDict::maxKeyLength);
+        if (!items->isSet(key.c_str())) items->set(key.c_str(), Any(value));
+        return false;
+    });
+    return found ? 0 : -1;
 }
 
 Any QvIniParser::getValue(const char* section, const char* key) const {
-    for (int i = 0; i < sections_.size(); ++i) {
-        if (!(sections_.at(i) == section)) continue;
-        for (const Any& pair : items_.at(i).asVector())
-            if (pair.asVector().at(0) == key) return pair.asVector().at(1);
-    }
-    return Any();
+    Any result;
+    visitItems(section, [&](const char* candidate, const char* value) {
+        if (!key || std::strcmp(candidate, key) != 0) return false;
+        result = value;
+        return true;
+    });
+    return result;
 }
 
 template <class Number>

@@ -6,8 +6,14 @@
 //
 // Keys and values are text without surrounding blanks and tabs; the key ends at the first "=", or without one
 // at the first ":". Lines have at most 1,024 characters. Sections and keys may appear more than once: the
-// first that answers wins. A byte order mark of UTF-8 at the start is skipped.
+// first that answers wins. A byte order mark of UTF-8 at the start is skipped. A file takes less than 60
+// times its size of memory; of more messages than maxErrors only the first are kept, with a last one that
+// says so.
 #pragma once
+
+#include <cstddef>
+#include <string>
+#include <vector>
 
 #include "core/arch/api.h"
 #include "core/value/any.h"
@@ -15,6 +21,8 @@
 
 class QV_API QvIniParser {
   public:
+    static constexpr int maxErrors = 10'000;
+
     // Replaces what was loaded before. 0, -9 if the file can't be read, -15 if lines of it can't be
     // understood: the others are loaded all the same. With several failures the last stands. `errors`, which
     // may be null, is replaced by a message for each line that was passed over ("line %d: ..."), which may
@@ -38,11 +46,15 @@ class QV_API QvIniParser {
     const AnyVector& errors() const { return errors_; }
 
   private:
-    // Parallel: the items of a section are pairs, vectors of key and value.
+    // Files may have millions of keys, so the items are no values of their own, but text: keys and values in
+    // turn, each with its NUL. A section's begin at its start and end at the start of the next.
     AnyVector errors_;
     AnyVector sections_;
-    AnyVector items_;
+    std::vector<std::size_t> starts_;
+    std::string items_;
 
+    template <class Visit>
+    bool visitItems(const char* section, Visit visit) const;
     template <class Number>
     Number number(const char* section, const char* key, Number fallback, const char* failure);
 };

@@ -88,6 +88,12 @@ class QV_API XmlParser {
     static constexpr long long maxToken = 8LL << 20;  // one tag, comment or declaration; also the sum of all
                                                       // values that attributes take from declared defaults
     static constexpr long long maxExpanded = 64LL << 20;  // the bytes that all `gen` elements describe
+    // restoreDict alone: the dictionaries under a class name, each of which takes several hundred bytes of
+    // memory. A document may hold more of them if it has at least bytesPerObject bytes for each.
+    // Within these limits neither a tree nor its dictionary takes more than 60 bytes of memory for a byte of
+    // a document of a megabyte or more.
+    static constexpr int maxObjects = 20'000;
+    static constexpr int bytesPerObject = 16;
 
     XmlParser() = default;
     XmlParser(const XmlParser&) = delete;
@@ -115,7 +121,8 @@ class QV_API XmlParser {
     // "__version__", else "2.0". Throws as storeXmlTree.
     static int storeDict(const Any& path, const AnyDict& dict, const char* className = nullptr,
                          const Any& version = Any());
-    // Reads it again: 0, or -1 if the file can't be read or holds nothing, with the reason in the debug log.
+    // Reads it again: 0, or -1 if the file can't be read, holds nothing or is beyond a limit, with the reason
+    // in the debug log.
     // "__class__" is the root's name, which is also `rootName`; `version` is a String, or the Int32 -1 if the
     // document has none. `dict` never keeps what it held before.
     static int restoreDict(const Any& path, AnyDict& dict, Any& rootName, Any& version);
@@ -126,6 +133,7 @@ class QV_API XmlParser {
     XmlNodeStack _parseStack;
     XmlNode* _root = nullptr;
     Watch* _watch = nullptr;
+    long long _bytes = 0;  // of the document that the tree came from
 
     void startElementHandler(const char* name, const char** attrs);
     void endElementHandler(const char* name);
@@ -133,6 +141,7 @@ class QV_API XmlParser {
     static void s_startElementHandler(void* self, const char* name, const char** attrs);
     static void s_endElementHandler(void* self, const char* name);
     static void s_dataHandler(void* self, const char* text, int size);
+    bool tooManyObjects() const;
     void parseStream(void* stream, const Any& path);
     void _cleanup();
 };

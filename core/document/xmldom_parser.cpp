@@ -178,5 +178,6 @@ int XmlParser::parseFile(const Any& path) {
         throw;
     }
     _watch = nullptr;
+    _bytes = watch.bytes;
     return 0;
 }

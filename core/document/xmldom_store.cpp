@@ -1,4 +1,8 @@
 // The file round trip of dictionaries.
+#include <algorithm>
+#include <string_view>
+#include <vector>
+
 #include "core/arch/qvassert.h"
 #include "core/arch/qvexception.h"
 #include "core/document/xmldom.h"
@@ -24,7 +28,28 @@ bool hasClass(const Any& className) {
     }
 }
 
+// An element that is read as a dictionary of this class.
+bool isObject(const XmlNode& node) {
+    if (qvXmlTypeOf(node.name())) return false;
+    for (const std::string_view part : {"key", "ent", "val"})
+        if (node.name() == part) return false;
+    return true;
+}
+
 }  // namespace
+
+bool XmlParser::tooManyObjects() const {
+    const long long most = std::max<long long>(maxObjects, _bytes / bytesPerObject);
+    long long objects = 0;
+    std::vector<const XmlNode*> pending{_root};
+    while (!pending.empty() && objects <= most) {
+        const XmlNode* const node = pending.back();
+        pending.pop_back();
+        objects += isObject(*node) ? 1 : 0;
+        for (int i = node->nrChildren() - 1; i >= 0; --i) pending.push_back(node->child(i));
+    }
+    return objects > most;
+}
 
 int XmlParser::storeDict(const Any& path, const AnyDict& dict, const char* className, const Any& version) {
     const Any name = className ? Any(className) : dict.get("__class__");
@@ -50,6 +75,11 @@ int XmlParser::restoreDict(const Any& path, AnyDict& dict, Any& rootName, Any& v
     qv_dbg()->debug("XmlParser.restoreDict: parseFile %f", timer.stop());
     XmlNode* const root = parser.topLevel();
     if (!root) return result;
+    if (parser.tooManyObjects()) {
+        qv_dbg()->error("XmlParser.restoreDict: %s holds too many dictionaries",
+                        path.toString().asString(""));
+        return -1;
+    }
     rootName = root->name();
     if (root->getAttr("version").isString()) version = root->getAttr("version");
     if (root->nrChildren() == 0) {

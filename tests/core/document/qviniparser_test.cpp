@@ -1,5 +1,7 @@
 #include "core/document/qviniparser.h"
 
+#include <malloc.h>
+
 #include "tests/support/checks.h"
 
 namespace {
@@ -66,6 +68,34 @@ TEST_F(Ini, RepeatedSectionsAndKeysAnswerWithTheFirst) {
     EXPECT_EQ(items, AnyDict("a", "1", "b", "4"));
     EXPECT_EQ(ini.getSectionItems("none", &items), -1);
     EXPECT_EQ(items.size(), 0);
+}
+
+// Short lines in great numbers. (A sanitizer counts no memory here.)
+TEST_F(Ini, MemoryStaysInProportionToTheFile) {
+    for (const char* line : {"a=1\n", "[s]\n", "[s]\na=1\n", "a\n", "=1\n", "[s\n"}) {
+        std::string text = "[s]\n";
+        while (text.size() < 400'000) text += line;
+        const auto before = mallinfo2();
+        load(text);
+        const auto after = mallinfo2();
+        errors.clear();
+        EXPECT_LT(after.uordblks + after.hblkhd, before.uordblks + before.hblkhd + 60 * text.size()) << line;
+        ini = {};
+    }
+}
+
+TEST_F(Ini, MessagesEndWithOneThatSaysSo) {
+    const int most = QvIniParser::maxErrors;
+    for (const int more : {0, 1, 5}) {
+        std::string text = "[s]\n";
+        for (int i = 0; i < most + more; ++i) text += "bad\n";
+        EXPECT_EQ(load(text + "k=v"), -15);
+        EXPECT_EQ(std::ssize(errors), most + (more ? 1 : 0));
+        const int last = most + (more ? 2 : 1);
+        EXPECT_EQ(errors.back(), "line " + std::to_string(last) +
+                                     (more ? ": further messages are left out" : ": can't parse line"));
+        EXPECT_EQ(value("s", "k"), "v");
+    }
 }
 
 TEST_F(Ini, NumbersAreWholeOrTheDefaultWithAMessage) {

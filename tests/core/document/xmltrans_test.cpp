@@ -223,6 +223,24 @@ TEST(RestoreDict, resultsAndSideResults) {
     EXPECT_EQ(XmlParser::restoreDict("/nowhere/a.xml", r.dict, r.root, r.version), -1);
 }
 
+// Of small elements that are large as dictionaries there may be some, or many if they are not all there is.
+TEST(RestoreDict, limitsTheDictionariesOfADocument) {
+    const struct {
+        const char* each;
+        int count, result;
+    } cases[] = {{"<a/>", XmlParser::maxObjects - 1, 0},  // with the root
+                 {"<a/>", XmlParser::maxObjects, -1},
+                 {"<a/><vec></vec><vec></vec>", 2 * XmlParser::maxObjects, 0},
+                 {"<vec/>", 10 * XmlParser::maxObjects, 0}};
+    for (const auto& c : cases) {
+        std::string text = "<R><key>v</key><vec>";
+        for (int i = 0; i < c.count; ++i) text += c.each;
+        Restored r = restored(text + "</vec></R>");
+        EXPECT_EQ(r.result, c.result) << c.each;
+        EXPECT_EQ(r.dict.isSet("v"), c.result == 0) << c.each;
+    }
+}
+
 TEST(XmlTransCustomDict, compactFormAndBack) {
     AnyDict dict("__class__", "Clip", "__version__", "1", "name", "N", "#note", "kept", "n", 1, "v",
                  AnyVector(1, AnyDict("x", 2)), "none", Any(), "rate", QvFramerate::f25p());
