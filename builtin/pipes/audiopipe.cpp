@@ -30,12 +30,12 @@ QvAf::~QvAf() {
 }
 
 int QvAf::init() {
+    if (getState() != stateCreated) return QvCodec::init();  // which refuses
     for (const auto& member : filters_) {
         if (member.filter->getState() != stateCreated) continue;
         if (const int result = member.filter->init()) return result;
     }
-    setState(stateInitialised);
-    return QvStatus::ok;
+    return QvCodec::init();
 }
 
 int QvAf::open() {

@@ -28,12 +28,12 @@ QvVf::~QvVf() {
 }
 
 int QvVf::init() {
+    if (getState() != stateCreated) return QvCodec::init();  // which refuses
     for (const auto& filter : filters_) {
         if (filter->getState() != stateCreated) continue;
         if (const int result = filter->init()) return result;
     }
-    setState(stateInitialised);
-    return QvStatus::ok;
+    return QvCodec::init();
 }
 
 int QvVf::open() {

@@ -35,6 +35,19 @@ struct Source : FakeDecoder {
     }
 };
 
+TEST(AudioPipe, IsInitialisedOnce) {
+    Pipe pipe({"a"});
+    for (const bool open : {false, true}) {
+        if (open) {
+            EXPECT_EQ(pipe.open(), 0);
+        }
+        const auto state = pipe.getState();
+        EXPECT_EQ(pipe.init(), QvStatus::failed);
+        EXPECT_STREQ(pipe.errorDesc(), "Already initialized");
+        EXPECT_EQ(pipe.getState(), state);
+    }
+}
+
 TEST(AudioPipe, GivesWhatIsAskedFor) {
     Source decoder(10000);
     Pipe pipe({"a", "b"});

@@ -31,6 +31,19 @@ struct Pipe : QvVf {
     }
 };
 
+TEST(VideoPipe, IsInitialisedOnce) {
+    Pipe pipe({"a"});
+    for (const bool open : {false, true}) {
+        if (open) {
+            EXPECT_EQ(pipe.open(), 0);
+        }
+        const auto state = pipe.getState();
+        EXPECT_EQ(pipe.init(), QvStatus::failed);
+        EXPECT_STREQ(pipe.errorDesc(), "Already initialized");
+        EXPECT_EQ(pipe.getState(), state);
+    }
+}
+
 TEST(VideoPipe, PositionsAndNames) {
     Pipe pipe({"a", "b"});
     pipe.add("c", 0);
