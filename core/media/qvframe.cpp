@@ -88,9 +88,27 @@ int QvFrame::init(unsigned four_cc, int width, int height, unsigned char* buffer
     }
     totalBytes_ = static_cast<int>(layout.total);
     inited_ = true;
+    if (!buffer) clearTails();
     frameNr = -1;
     framerate.setInterlaced(0);
     return QvStatus::ok;
+}
+
+// What no picture operation writes reaches files with the rest of the block, and must not show what the
+// memory held before: the end of each row from the last whole pixel group on, and the rows that odd heights,
+// and the lower half of I422's chroma, leave below height(plane).
+void QvFrame::clearTails() {
+    for (int p = 0; p < planes_; ++p) {
+        const int stride = tt_.strides[p];
+        const int pairs = width(p) & ~1;  // packed formats store pixels in pairs
+        const int used = format_->pixelBytes < 0 ? width(p) / 6 * 16 : pairs * format_->pixelBytes;
+        const std::ptrdiff_t rows = std::ptrdiff_t{height(p)} * stride;
+        unsigned char* const plane = tt_.planes[p];
+        if (used < stride)
+            for (std::ptrdiff_t row = 0; row < rows; row += stride)
+                std::memset(plane + row + used, 0, static_cast<std::size_t>(stride - used));
+        std::memset(plane + rows, 0, static_cast<std::size_t>(planeBytes_[p] - rows));
+    }
 }
 
 void QvFrame::destroy() {

@@ -50,11 +50,12 @@ class QV_API QvFrame {
     QvFrame& operator=(const QvFrame& other);  // deep; same size and FOURCC: into the planes that are there
     ~QvFrame();
 
-    // Gives the frame a format and forgets everything it held. The memory is not cleared. `buffer`, if given,
-    // is used as it stands and stays the caller's: it must hold total_bytes() and outlive the frame's use.
-    // `strides`: up to three integers, each of which replaces the default of its plane if it is larger.
-    // 0, or -3 (frame empty) without memory, for a negative size or above 2 GB. An unknown FOURCC is an
-    // assertion with a log line.
+    // Gives the frame a format and forgets everything it held. The pixels are not cleared; the bytes of its
+    // own memory that belong to no pixel (the padding of rows, what odd sizes leave at the end of a plane,
+    // the lower half of I422's chroma) are 0. `buffer`, if given, is used unchanged and stays the caller's:
+    // it must hold total_bytes() and outlive the frame's use. `strides`: up to three integers, each of which
+    // replaces the default of its plane if it is larger. 0, or -3 (frame empty) without memory, for a
+    // negative size or above 2 GB. An unknown FOURCC is an assertion with a log line.
     int init(unsigned four_cc, int width, int height, unsigned char* buffer = nullptr,
              const AnyVector* strides = nullptr);
     void destroy();
@@ -178,6 +179,7 @@ class QV_API QvFrame {
     void _copyMeta(const QvFrame& src, const char* kept);  // null, or the key of an entry that is left alone
     bool sameFormat(unsigned four_cc, int width, int height) const;
     int takeFormat(unsigned four_cc, int width, int height);
+    void clearTails();
     std::ptrdiff_t pixelOffset(int x, int y, int plane) const;
 };
 

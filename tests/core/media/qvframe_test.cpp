@@ -1,5 +1,7 @@
 #include "core/media/qvframe.h"
 
+#include <malloc.h>
+
 #include "core/engine/status.h"
 #include "tests/core/media/frame_model.h"
 #include "tests/support/checks.h"
@@ -101,6 +103,35 @@ TEST(QvFrame, InitForgetsAndExternalMemoryStays) {
     ASSERT_EQ(frame.init(GRAY, 4, 6), 0);
     EXPECT_TRUE(!frame.external() && frame.framerate == QvFramerate(25.0));
     EXPECT_TRUE(frame.frameNr == -1 && frame.getTimestamp() == -1);
+}
+
+// Memory that held something else before.
+struct UsedMemory {
+    UsedMemory() { mallopt(M_PERTURB, 85); }
+    ~UsedMemory() { mallopt(M_PERTURB, 0); }
+};
+
+TEST(QvFrame, BytesOfNoPixelAreZero) {
+    const UsedMemory used;
+    for (unsigned fourcc : allFormats())
+        for (int width : {1, 2, 5, 33, 50})
+            for (int height : {1, 4, 7})
+                for (int padding : {0, 5}) {
+                    QvFrame plain, frame;
+                    plain.init(fourcc, width, height);
+                    AnyVector strides;
+                    for (int p = 0; p < plain.planes(); ++p) strides.append(Any(plain.stride(p) + padding));
+                    ASSERT_EQ(frame.init(fourcc, width, height, nullptr, &strides), 0);
+                    for (int p = 0; p < frame.planes(); ++p) {
+                        const int perPixel = fourcc == v210 ? 0 : frame.pixelBytes(p);
+                        const int row = fourcc == v210 ? (width + 5) / 6 * 16 : frame.width(p) * perPixel;
+                        for (int i = 0; i < frame.plane_bytes(p); ++i) {
+                            if (i % frame.stride(p) < row && i / frame.stride(p) < frame.height(p)) continue;
+                            ASSERT_EQ(frame.plane(p)[i], 0) << frame.str_four_cc() << ' ' << width << 'x'
+                                                            << height << " plane " << p << " byte " << i;
+                        }
+                    }
+                }
 }
 
 // The byte of black at a place of a row.
