@@ -117,5 +117,7 @@ void RawAudioEnc::store(AnyDict& state) const { state = rawsettings::stored(RawA
 
 int RawAudioEnc::restore(const AnyDict& state) {
     if (state.get("name") != name()) return setError(QvStatus::failed, "restore - invalid name");
-    return rawsettings::restore(RawAudioParams::rows(), *this, state);
+    return rawsettings::restore(*this, state, [this](const AnyDict& rows) {
+        return _restoreRows(RawAudioParams::rows(), *this, rows);
+    });
 }

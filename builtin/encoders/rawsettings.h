@@ -38,14 +38,15 @@ AnyDict stored(std::span<const QvParamRow<Encoder>> rows, const Encoder& encoder
     return AnyDict("name", encoder.name(), "settingsDict", settings);
 }
 
-// The older form has the settings beside the name, or in "settings". The caller has checked the name.
-template <class Encoder>
-int restore(std::span<const QvParamRow<Encoder>> rows, Encoder& encoder, const AnyDict& state) {
+// The older form has the settings next to the name, or in "settings". The caller has checked the name;
+// restoreRows(dict) sets the encoder's rows.
+template <class Encoder, class RestoreRows>
+int restore(Encoder& encoder, const AnyDict& state, RestoreRows restoreRows) {
     const Any& current = state.get("settingsDict");
-    if (current.isDict()) return qvRestoreParamRows(rows, encoder, current.asDict());
+    if (current.isDict()) return restoreRows(current.asDict());
+    const int rows = restoreRows(state);
     const Any& older = state.get("settings");
-    const int result = older.isDict() ? encoder.setParamDict(older.asDict()) : QvStatus::ok;
-    return result | qvRestoreParamRows(rows, encoder, state);
+    return (older.isDict() ? encoder.setParamDict(older.asDict()) : QvStatus::ok) | rows;
 }
 
 }  // namespace rawsettings

@@ -128,5 +128,7 @@ void RawVideoEnc::store(AnyDict& state) const { state = rawsettings::stored(RawV
 
 int RawVideoEnc::restore(const AnyDict& state) {
     if (state.get("name") != name()) return setError(QvStatus::failed, "restore - invalid name");
-    return rawsettings::restore(RawVideoParams::rows(), *this, state);
+    return rawsettings::restore(*this, state, [this](const AnyDict& rows) {
+        return _restoreRows(RawVideoParams::rows(), *this, rows);
+    });
 }

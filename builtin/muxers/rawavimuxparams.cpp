@@ -47,5 +47,5 @@ void RawAviMux::store(AnyDict& state) const {
 
 int RawAviMux::restore(const AnyDict& state) {
     if (!(state.get("name") == name())) return setError(QvStatus::failed, "restore - invalid name");
-    return qvRestoreParamRows(RawAviMuxParams::rows(), *this, state);
+    return _restoreRows(RawAviMuxParams::rows(), *this, state);
 }

@@ -62,5 +62,5 @@ void RawMux::store(AnyDict& state) const {
 
 int RawMux::restore(const AnyDict& state) {
     if (!(state.get("name") == name())) return setError(QvStatus::failed, "restore - invalid name");
-    return qvRestoreParamRows(RawMuxParams::rows(), *this, state);
+    return _restoreRows(RawMuxParams::rows(), *this, state);
 }

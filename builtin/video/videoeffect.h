@@ -83,8 +83,8 @@ class VideoEffectOf : public VideoEffect {
         if (!acceptsState(dict)) return QvStatus::failed;
         if (dict.get("state").isDict()) {
             Settings restored = settings_;
-            const int result = qvRestoreParamRows<Settings>(rows_, restored, dict.get("state").asDict());
-            if (result != QvStatus::ok) return setError(result, "invalid value in the stored state");
+            if (const int result = _restoreRows<Settings>(rows_, restored, dict.get("state").asDict()))
+                return result;
             settings_ = std::move(restored);
         }
         return VideoEffect::restore(dict);

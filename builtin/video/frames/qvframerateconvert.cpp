@@ -94,7 +94,7 @@ void QvFramerateConvert::store(AnyDict& dict) const {
 int QvFramerateConvert::restore(const AnyDict& dict) {
     if (const int result = QvVideoFilter::restore(dict)) return result;
     if (!dict.get("state").isDict()) return QvStatus::ok;
-    return qvRestoreParamRows<Settings>(rows, settings_, dict.get("state").asDict());
+    return _restoreRows<Settings>(rows, settings_, dict.get("state").asDict());
 }
 
 int QvFramerateConvert::open() {

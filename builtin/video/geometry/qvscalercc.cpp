@@ -108,6 +108,8 @@ void QvScalerCC::store(AnyDict& dict) const {
     QvVideoFilter::store(dict);
     AnyDict state;
     qvStoreParamRows<Settings>(rows, settings_, state);
+    // No format, or one that is no text of four characters, can only be set again as its number.
+    if (state.get("FOURCC").size() != 4) state.set("FOURCC", static_cast<int>(settings_.fourcc));
     dict.set("state", state);
 }
 
@@ -118,7 +120,7 @@ int QvScalerCC::restore(const AnyDict& dict) {
     }
     if (const int result = QvVideoFilter::restore(dict)) return result;
     if (!dict.get("state").isDict()) return QvStatus::ok;
-    return qvRestoreParamRows<Settings>(rows, settings_, dict.get("state").asDict());
+    return _restoreRows<Settings>(rows, settings_, dict.get("state").asDict());
 }
 
 int QvScalerCC::open() {

@@ -253,14 +253,18 @@ void qvStoreParamRows(std::span<const QvParamRow<T>> rows, const T& object, AnyD
 }
 
 // Takes every stored row that `dict` holds; rows it lacks keep their value. The result is the first status
-// other than ok, or ok.
+// other than ok, or ok. `refused`, which may be null, becomes the row of that status, or null.
 template <class T>
-int qvRestoreParamRows(std::span<const QvParamRow<T>> rows, T& object, const AnyDict& dict) {
+int qvRestoreParamRows(std::span<const QvParamRow<T>> rows, T& object, const AnyDict& dict,
+                       const QvParamRow<T>** refused = nullptr) {
     int result = QvStatus::ok;
+    if (refused) *refused = nullptr;
     for (const auto& row : rows) {
         if (!(row.flags & qvParamStored) || !dict.isSet(row.name)) continue;
         const auto status = qvSetParamRow(rows, object, row.name, dict.get(row.name));
-        if (status && *status != QvStatus::ok && result == QvStatus::ok) result = *status;
+        if (!status || *status == QvStatus::ok || result != QvStatus::ok) continue;
+        result = *status;
+        if (refused) *refused = &row;
     }
     return result;
 }
@@ -314,5 +318,17 @@ std::optional<int> QvCodec::_setRow(std::span<const QvParamRow<T>> rows, T& obje
     _traceParam(name, value);
     const std::optional<int> result = qvSetParamRow(rows, object, name, value);
     if (result == QvStatus::invalidParam) setError(*result, "%s", qvParamRefusal(rows, name, value).c_str());
+    return result;
+}
+
+// A field with a setter of its own may have given its reason already.
+template <class T>
+int QvCodec::_restoreRows(std::span<const QvParamRow<T>> rows, T& object, const AnyDict& dict) {
+    const QvParamRow<T>* refused = nullptr;
+    setError(QvStatus::ok);
+    const int result = qvRestoreParamRows(rows, object, dict, &refused);
+    if (refused && !*errorDesc())
+        setError(result, "invalid value in the stored state: %s",
+                 qvParamRefusal(rows, refused->name, dict.get(refused->name)).c_str());
     return result;
 }

@@ -91,6 +91,10 @@ class QV_API QvCodec {
     template <class T>
     std::optional<int> _setRow(std::span<const QvParamRow<T>> rows, T& object, const char* name,
                                const Any& value);
+    // Sets every stored row that `dict` holds. A refused value leaves its field alone; the result and the
+    // error text are those of the first one.
+    template <class T>
+    int _restoreRows(std::span<const QvParamRow<T>> rows, T& object, const AnyDict& dict);
 
   private:
     friend class QvModule;

@@ -1,8 +1,12 @@
+#include <gmock/gmock.h>
+
+#include <memory>
 #include <set>
 
 #include "builtin/modules.h"
 #include "core/engine/modules/qvcodec.h"
 #include "core/engine/modules/qvregistry.h"
+#include "core/engine/status.h"
 #include "tests/support/checks.h"
 #include "tests/support/engine.h"
 
@@ -25,6 +29,28 @@ TEST_F(Builtin, ModulesStandInTheirOrder) {
     };
     ASSERT_EQ(registry.nrModules(0), 44);
     for (int i = 0; i < 44; ++i) EXPECT_STREQ(registry.module(i)->name(), names[i]);
+}
+
+TEST_F(Builtin, ARestoredValueThatIsRefusedIsNamed) {
+    const struct {
+        const char *module, *part, *row;
+        Any value;
+    } cases[] = {
+        {"scaler", "state", "outWidth", "wide"},       {"frconvert", "state", "outFramerate", "fast"},
+        {"brightness", "state", "gamma", 11.0},        {"rawmux", nullptr, "splitVideo", "often"},
+        {"rawavimux", nullptr, "segments", 0},         {"rawvenc", "settingsDict", "width", "wide"},
+        {"rawaenc", "settingsDict", "channels", "all"}};
+    for (const auto& c : cases) {
+        const std::unique_ptr<QvCodec> codec(registry.newCodec(c.module));
+        AnyDict stored;
+        codec->store(stored);
+        AnyDict& rows = c.part ? stored[c.part].asDict() : stored;
+        ASSERT_TRUE(rows.isSet(c.row)) << c.module;
+        EXPECT_EQ(codec->restore(stored), 0) << c.module << codec->errorDesc();
+        rows.set(c.row, c.value);
+        EXPECT_EQ(codec->restore(stored), QvStatus::invalidParam) << c.module;
+        EXPECT_THAT(codec->errorDesc(), testing::HasSubstr(std::string("'") + c.row + "' takes")) << c.module;
+    }
 }
 
 TEST_F(Builtin, DecodersAreFoundByExtension) {

@@ -56,6 +56,20 @@ TEST(QvScalerCC, ParametersAreKeptStoredAndRestored) {
     EXPECT_EQ(other.restore(stored), -1);
 }
 
+TEST(QvScalerCC, AnyFourccIsRestoredAlsoNone) {
+    for (const int fourcc : {0, 5, 'A' << 16, static_cast<int>(QvFourcc::v210)}) {
+        QvScalerCC scaler, other;
+        scaler.init();
+        other.init();
+        EXPECT_EQ(other.setParam("FOURCC", "I420"), 0);
+        EXPECT_EQ(scaler.setParam("FOURCC", fourcc), 0);
+        AnyDict stored;
+        scaler.store(stored);
+        EXPECT_EQ(other.restore(stored), 0) << fourcc;
+        EXPECT_EQ(other.getParam("FOURCCint"), Any(fourcc));
+    }
+}
+
 TEST(QvScalerCC, OutputsThatCanNotBeMadeFailToOpen) {
     for (const auto& [fourcc, w, h] :
          {std::tuple{"XYZW", 8, 8}, {"I420", 0, 8}, {"I420", 8, -1}, {"BGR4", 1 << 20, 1 << 20}}) {
