@@ -8,11 +8,13 @@
 
 namespace {
 
+Any testFont() { return qv_registry()->defaultFontFile(1); }
+
 class TestText : public CardText {
   public:
     int init(int height) {
         QvTextRenderingOptions options;
-        options.fontRegular = qv_registry()->defaultFontFile(1);
+        options.fontRegular = testFont();
         options.charSize = height / 16 * 7 / 8;
         return render_.init(options);
     }
@@ -35,3 +37,5 @@ std::unique_ptr<CardText> makeTestText(int height) {
     if (text->init(height) != QvStatus::ok) return nullptr;
     return text;
 }
+
+void findTestFont() { testFont(); }

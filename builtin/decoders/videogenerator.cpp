@@ -27,6 +27,7 @@ void copyPixels(const QvFrame& from, QvFrame& to) {
 }  // namespace
 
 int VideoGenerator::init(const AnyDict& dict) {
+    findTestFont();
     takeFramerate(dict["framerate"]);
     if (!dict["picture"].isValid()) {
         if (const int result = addPlain(dict); result != QvStatus::ok) return result;

@@ -173,7 +173,10 @@ class QV_API QvPlatform {
     // Appends the code points of `bytes`, read in a code page, to `text`. What is not valid in it becomes
     // U+FFFD, a byte each. False if the system does not know the code page.
     virtual bool decodeCodepage(int number, std::string_view bytes, std::u32string& text);
-    virtual std::string fontFile(QvFontFace face);  // full name, empty if the system has no font at all
+    // Full name, empty if the system has no font at all. The fonts are looked for once, by the first call
+    // that finds some, and again when the file is gone. fontconfig ends the process where it gets no memory:
+    // std::bad_alloc if there are not 8 MB for it.
+    virtual std::string fontFile(QvFontFace face);
     // Fonts that together have as many of the letters as the system's fonts can draw, nearest to `like`
     // first.
     virtual std::vector<QvFontFile> fontsWith(std::u32string_view letters, QvFontFace like);

@@ -1,6 +1,10 @@
 #include <fontconfig/fontconfig.h>
 #include <algorithm>
+#include <array>
+#include <cstdlib>
 #include <memory>
+#include <mutex>
+#include <new>
 
 #include "core/arch/platform.h"
 
@@ -33,8 +37,21 @@ constexpr Face faces[] = {
 
 constexpr const char* genericFamilies[] = {"sans", "sans-serif", "serif", "mono", "monospace"};
 
+constexpr std::size_t spareBytes = 8 << 20;
+
+using Files = std::array<std::string, std::size(faces)>;
+
+// fontconfig ends the process where an allocation fails. With some dozens of fonts it takes 4 MB, so it is
+// not called with less than twice that.
+void needSpareMemory() {
+    void* volatile spare = std::malloc(spareBytes);  // volatile, or the compiler leaves both calls out
+    if (!spare) throw std::bad_alloc();
+    std::free(spare);
+}
+
 Pattern request(const Face& face, const char* family) {
     Pattern pattern(FcPatternCreate());
+    if (!pattern) throw std::bad_alloc();
     FcPatternAddString(pattern.get(), FC_FAMILY, reinterpret_cast<const FcChar8*>(family));
     FcPatternAddInteger(pattern.get(), FC_WEIGHT, face.weight);
     FcPatternAddInteger(pattern.get(), FC_SLANT, face.slant);
@@ -83,21 +100,38 @@ bool isGeneric(const std::string& family) {
     });
 }
 
-}  // namespace
-
-std::string QvPlatform::fontFile(QvFontFace face) {
-    // A configuration of our own: an application may be using the shared one on another thread.
-    const Config config(FcInitLoadConfigAndFonts());
-    if (!config) return "";
-    const Face& asked = faces[static_cast<int>(face)];
-    const Pattern wanted = request(asked, asked.family);
-    complete(config.get(), wanted.get());
+std::string match(FcConfig* config, const Face& face) {
+    const Pattern wanted = request(face, face.family);
+    complete(config, wanted.get());
     FcResult result = FcResultNoMatch;
-    const Pattern found(FcFontMatch(config.get(), wanted.get(), &result));
+    const Pattern found(FcFontMatch(config, wanted.get(), &result));
     return found ? fileOf(found.get()).name : "";
 }
 
+Files askForAll() {
+    needSpareMemory();
+    Files files;
+    // A configuration of our own: an application may be using the shared one on another thread.
+    const Config config(FcInitLoadConfigAndFonts());
+    if (!config) return files;
+    for (std::size_t i = 0; i < files.size(); ++i) files[i] = match(config.get(), faces[i]);
+    return files;
+}
+
+}  // namespace
+
+std::string QvPlatform::fontFile(QvFontFace face) {
+    static std::mutex mutex;
+    static Files known;
+    const std::lock_guard lock(mutex);
+    std::string& file = known[static_cast<std::size_t>(face)];
+    QvFileStatus status;
+    if (file.empty() || !this->status(file.c_str(), status)) known = askForAll();
+    return file;
+}
+
 std::vector<QvFontFile> QvPlatform::fontsWith(std::u32string_view letters, QvFontFace like) {
+    needSpareMemory();
     std::vector<QvFontFile> files;
     const Config config(FcInitLoadConfigAndFonts());
     const CharSet letterSet(FcCharSetCreate());
@@ -120,6 +154,7 @@ std::vector<QvFontFile> QvPlatform::fontsWith(std::u32string_view letters, QvFon
 }
 
 QvFontFile QvPlatform::fontOf(const std::string& family, QvFontFace like) {
+    needSpareMemory();
     const Config config(FcInitLoadConfigAndFonts());
     if (!config) return {};
     const Pattern wanted = request(faces[static_cast<int>(like)], family.c_str());
@@ -131,6 +166,7 @@ QvFontFile QvPlatform::fontOf(const std::string& family, QvFontFace like) {
 }
 
 std::vector<std::string> QvPlatform::fontFamilies() {
+    needSpareMemory();
     std::vector<std::string> names;
     const Config config(FcInitLoadConfigAndFonts());
     if (!config) return names;
