@@ -2,9 +2,10 @@
 find_program(QV_CCACHE ccache)
 if(QV_CCACHE)
   # The base folder makes objects of equal sources shareable between checkouts. Precompiled headers are known by
-  # what they were made of, not by their time.
+  # what they were made of, not by their time; and by their files, comments included, because the compiler knows
+  # a header that is in one by its bytes: so nothing is looked up by preprocessed text (CCACHE_DEPEND).
   set(CMAKE_CXX_COMPILER_LAUNCHER
-      ${CMAKE_COMMAND} -E env CCACHE_BASEDIR=${CMAKE_SOURCE_DIR} CCACHE_NOHASHDIR=1
+      ${CMAKE_COMMAND} -E env CCACHE_BASEDIR=${CMAKE_SOURCE_DIR} CCACHE_NOHASHDIR=1 CCACHE_DEPEND=1
       CCACHE_SLOPPINESS=pch_defines,time_macros ${QV_CCACHE})
 endif()
 find_program(QV_MOLD mold)
