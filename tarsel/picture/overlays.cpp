@@ -182,9 +182,7 @@ void checkFont(const std::string& name, const std::string& what) {
     if (isFamily(name)) return;
     std::vector<std::string> families;
     for (const Any& family : qv_registry()->fontFamilies()) families.emplace_back(family.asString(""));
-    std::string near = suggestion(name, families);
-    if (!near.empty()) near = near.substr(1) + " ";
-    throw failure(Msg::noSuchFont, {what, name, near});
+    throw failure(Msg::noSuchFont, {what, name, suggestion(name, families)});
 }
 
 void setFont(QvCodec& filter, const std::string& name, const std::string& what) {

@@ -70,9 +70,9 @@ TEST_F(BadInput, TheReasonIsTheTrueOne) {
          "can't open 'text.scc': this is no SCC file; its first line has to be Scenarist_SCC V1.0"},
         {{"captions", "none.scc"}, "can't open 'none.scc': it has no caption lines; check how it was made"},
         {{"frame", "testgen", "--subtitles", "text.srt", "-o", "x.png"},
-         "--subtitles: can't use 'text.srt': there are no subtitles in it; check that it is a subtitle file "
-         "(.srt or "
-         ".sub)"},
+         "--subtitles: 'text.srt' has no subtitles: nothing in it has the times of one; --accept-partial "
+         "goes "
+         "without"},
         {{"frame", "testgen", "--timecode=font=text.srt", "-o", "x.png"},
          "--timecode: font: can't use 'text.srt': it is no font; give a TrueType or OpenType font"},
         {{"frame", "testgen:picture=text.png", "-o", "x.png"},

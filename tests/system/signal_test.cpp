@@ -107,10 +107,11 @@ TEST_F(Signal, ReachesTheCommandOfPost) {
     const Words job = {"transcode", "testgen:size=64x64,duration=0.1,audio=0", "-o", "out.raw", "-y",
                        "--post"};
     for (const int signal : {SIGTERM, SIGINT}) {
-        // What the shell has started gets it too; the shell writes only after that has ended.
+        // What the shell has started gets it too; the shell writes only after that has ended. The one that
+        // writes "started" ends by the signal, whenever it comes.
         const std::string name = signal == SIGTERM ? "TERM" : "INT";
         Process run(words(job + Words{"trap 'echo got " + name + "' " + name +
-                                      "; echo started; sleep 1000; echo awake; exit 0"}),
+                                      "; sh -c 'echo started; exec sleep 1000'; echo awake; exit 0"}),
                     here());
         ASSERT_TRUE(run.waitFor("started"));
         run.signal(signal);
