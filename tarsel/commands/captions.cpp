@@ -5,24 +5,17 @@
 #include <string>
 #include <vector>
 
+#include "tarsel/captions/captiontext.h"
+#include "tarsel/commands/captionexport.h"
 #include "tarsel/commands/commands.h"
 #include "tarsel/host/console.h"
 #include "tarsel/host/files.h"
 #include "tarsel/source/captionfile.h"
 #include "tarsel/source/source.h"
 #include "tarsel/words/commandline.h"
-#include "tarsel/words/json.h"
 #include "tarsel/words/messages.h"
 
 namespace {
-
-std::string timecodeText(const MediaTime& time, const QvFramerate& rate) {
-    char text[QvTimecode::textSize];
-    time.timecode(rate).pprint(text, false);
-    std::string shown = text;
-    if (rate.df()) shown[shown.rfind(':')] = ';';
-    return shown;
-}
 
 std::string bytesText(std::span<const QvCcBytePair> pairs) {
     std::string text;
@@ -34,30 +27,21 @@ std::string bytesText(std::span<const QvCcBytePair> pairs) {
     return text;
 }
 
-void printLine(std::span<const QvCcBytePair> pairs, const QvFramerate& rate, bool json) {
+void printLine(std::span<const QvCcBytePair> pairs, const QvFramerate& rate) {
     const int field = pairs.front().type() + 1;
     const std::string time = timecodeText(pairs.front().time, rate), bytes = bytesText(pairs),
                       text = qvCcText(pairs, pairs.front().type());
-    if (!json) {
-        print("%s\t%d\t%s\t%s\n", time.c_str(), field, bytes.c_str(), text.c_str());
-        return;
-    }
-    const Json line = {{"time", time},
-                       {"seconds", pairs.front().time.seconds()},
-                       {"field", field},
-                       {"bytes", bytes},
-                       {"text", text}};
-    print("%s\n", line.dump().c_str());
+    print("%s\t%d\t%s\t%s\n", time.c_str(), field, bytes.c_str(), text.c_str());
 }
 
 // A line for each field and time.
-void printLines(const QvCcData& data, const QvFramerate& rate, bool json) {
+void printLines(const QvCcData& data, const QvFramerate& rate) {
     const auto pairs = data.pairs();
     for (auto begin = pairs.begin(); begin != pairs.end();) {
         const auto end = std::find_if(begin, pairs.end(), [&](const auto& p) {
             return p.type() != begin->type() || !(p.time == begin->time);
         });
-        printLine({begin, end}, rate, json);
+        printLine({begin, end}, rate);
         begin = end;
     }
 }
@@ -75,7 +59,7 @@ std::unique_ptr<QvDecodePipe> openFiles(const std::vector<std::string>& files) {
     refuseScc(files.front());
 }
 
-void showCaptions(const std::vector<std::string>& files, bool json) {
+void showCaptions(const std::vector<std::string>& files) {
     QvFramerate rate = openFiles(files)->QvCodec::getParam("framerate").asFramerate();
     printWarnings();
     const bool dropFrame = rate.df();
@@ -88,19 +72,23 @@ void showCaptions(const std::vector<std::string>& files, bool json) {
         all.extend(one);
     }
     all.sort();
-    printLines(all, rate, json);
+    printLines(all, rate);
 }
 
 }  // namespace
 
 void addCaptions(CommandLine& line) {
-    Command command = line.command("captions", "Show the captions of an SCC file: time, field, bytes, text");
-    struct Given {
-        std::vector<std::string> files;
-        bool json = false;
-    };
-    auto given = std::make_shared<Given>();
-    command.arguments("FILE", given->files, "SCC file of field 1, and one of field 2", 2);
-    command.flag("--json", given->json, "Print JSON, one object a line");
-    command.action([given] { showCaptions(given->files, given->json); });
+    Command command = line.command(
+        "captions",
+        "Show the captions of an SCC file: time, field, bytes, text; or write them in another form");
+    auto given = std::make_shared<CaptionExport>();
+    command.arguments("FILE", given->files, "SCC file of field 1, and one of field 2; or a subtitle file", 2);
+    command.flag("--srt", given->srt, "As SubRip, with the times at which captions are on the screen");
+    command.flag("--vtt", given->vtt, "As WebVTT");
+    command.flag("--scc", given->scc, "As SCC, captions that pop on");
+    command.flag("--json", given->json, "As JSON, one object a caption");
+    command.option("--rate", given->rate, "Frame rate of the timecodes", "R");
+    command.option("-o,--output", given->output, "What to write, in place of the standard output", "FILE");
+    given->outputs.add(command);
+    command.action([given] { given->wanted() ? given->run() : showCaptions(given->files); });
 }

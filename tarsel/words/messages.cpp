@@ -127,6 +127,13 @@ constexpr Message kMessages[] = {
     {Msg::muxerUnusable,     Exit::module, "the multiplexer {name} can't be used",   "{system}",                                              "'tarsel modules' lists what this installation has"},
     {Msg::outputNoModule,    Exit::module, "can't write {file}",                     "this installation can't write any output",              "install the engine again"},
     {Msg::aviNoModule,       Exit::module, "can't write {file}",                     "this installation has no AVI output",                   "choose another format"},
+    // captions
+    {Msg::captionsForms,   Exit::usage, "{option}",                              "{option} asks for another form",                               "give one of them"},
+    {Msg::captionsOneFile, Exit::usage, "{option}",                              "{file} is a second file, and the form holds the captions of one", "write each by itself"},
+    {Msg::captionsLost,    Exit::done,  "{file}",                                "the times of {text} of its subtitles can't be read",           "they are left out"},
+    {Msg::captionsLetters, Exit::done,  "captions can't show all letters",       "there are none for {name}",                                    "each became '?'"},
+    {Msg::captionsCut,     Exit::done,  "captions hold four rows of 32 letters", "{text} of them are longer",                                    "their ends are left out"},
+    {Msg::captionsLate,    Exit::done,  "captions take a frame for two letters", "{text} of them are too close to the one before",               "they come up to {text} late"},
     // subtitles
     {Msg::subtitlesOtherFile,       Exit::input, "--subtitles: can't read {file}",                     "it is no subtitle file",                                "give a .srt or a .sub file of text"},
     {Msg::subtitlesNoText,          Exit::input, "--subtitles: can't read {file}",                     "it is no text",                                         "give a SubRip (.srt) or MicroDVD (.sub) file"},

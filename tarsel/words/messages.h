@@ -127,6 +127,13 @@ enum class Msg : unsigned char {
     muxerUnusable,
     outputNoModule,
     aviNoModule,
+    // captions
+    captionsForms,
+    captionsOneFile,
+    captionsLost,
+    captionsLetters,
+    captionsCut,
+    captionsLate,
     // subtitles
     subtitlesOtherFile,
     subtitlesNoText,

@@ -15,12 +15,41 @@ TEST_F(Captions, LinesOfBothFieldsInTheOrderOfTime) {
               "01:00:00;29\t1\t9420 9420 94d0 c8e9 a180 942f\tHi!\n"
               "01:00:05;01\t2\t1520 d5ee 19b7\tUn♪\n"
               "01:00:10;02\t1\t942c\t\n");
-    EXPECT_THAT(tarsel({"captions", "b.scc", "--json"}).out,
-                testing::AllOf(testing::HasSubstr("\"time\":\"01:00:05;01\""),
-                               testing::HasSubstr("\"bytes\":\"1520 d5ee 19b7\"")));
     folder.write("guess.scc", header + "00:00:00:02 9420\n9900:0:0:0 9420");
     for (const char* command : {"captions", "info"})
         EXPECT_THAT(tarsel({command, "guess.scc"}).err, testing::HasSubstr("framerate guess"));
+}
+
+TEST_F(Captions, InOtherForms) {
+    folder.write("a.scc",
+                 "Scenarist_SCC V1.0\n\n00:00:01;00\t9420 9420 9470 9470 c8e9 2080 942f "
+                 "942f\n\n00:00:03;00\t942c 942c\n");
+    EXPECT_EQ(works({"captions", "a.scc", "--srt"}).out, "1\n00:00:01,201 --> 00:00:03,003\nHi\n\n");
+    EXPECT_EQ(works({"captions", "a.scc", "--vtt"}).out, "WEBVTT\n\n00:00:01.201 --> 00:00:03.003\nHi\n\n");
+    EXPECT_THAT(
+        works({"captions", "a.scc", "--json"}).out,
+        testing::AllOf(testing::HasSubstr("\"end_timecode\":\"00:00:03;00\",\"field\":1,\"text\":\"Hi\""),
+                       testing::HasSubstr("\"row\":15")));
+
+    // Text that becomes captions is the same text again, a frame sooner or later.
+    folder.write("t.srt",
+                 "1\n00:00:02,000 --> 00:00:04,000\nTom &amp; <i>Zo\xC3\xAB</i>\nsays \xE6\x97\xA5\n\n"
+                 "2\n00:00:05,000 --> 00:00:06,000\nbye\n");
+    const Outcome made = works({"captions", "t.srt", "--scc", "-o", "t.scc"});
+    EXPECT_THAT(made.err, testing::HasSubstr("there are none for '\xE6\x97\xA5'"));
+    EXPECT_EQ(contents("t.scc").substr(0, 20), "Scenarist_SCC V1.0\n\n");
+    EXPECT_EQ(works({"captions", "t.scc", "--srt"}).out,
+              "1\n00:00:02,002 --> 00:00:04,004\nTom & Zo\xC3\xAB\nsays ?\n\n"
+              "2\n00:00:05,005 --> 00:00:06,006\nbye\n\n");
+    EXPECT_THAT(works({"captions", "t.srt", "--scc", "--rate", "29.97"}).out,
+                testing::HasSubstr("00:00:01:"));
+
+    fails(4, {"captions", "t.srt", "--scc", "-o", "t.scc"}, {"'t.scc'", "-y"});
+    fails(2, {"captions", "t.srt", "--scc", "--srt"}, {"--scc", "--srt"});
+    fails(2, {"captions", "a.scc", "t.scc", "--srt"}, {"'t.scc'"});
+    fails(3, {"captions", "gone.srt", "--scc"}, {"'gone.srt'"});
+    folder.write("dark.scc", "Scenarist_SCC V1.0\n\n00:00:03;00\t942c 942c\n");
+    fails(3, {"captions", "dark.scc", "--srt"}, {"'dark.scc'"});
 }
 
 TEST_F(Captions, InfoTellsWhatATextFileHolds) {

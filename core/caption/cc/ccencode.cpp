@@ -99,7 +99,10 @@ class Encoder {
     }
 
   private:
-    long long slot(const MediaTime& time) const { return std::max(time.position(frames), 0LL); }
+    // The nearest frame.
+    long long slot(const MediaTime& time) const {
+        return std::max((time + MediaTime(500.5 / 30000)).position(frames), 0LL);
+    }
     double seconds(long long slots) const {
         return MediaTime(slots, frames, MediaTime::defaultTimescale).seconds();
     }

@@ -115,9 +115,9 @@ TEST(CcEncode, ComesBackAsItWas) {
     }
     EXPECT_TRUE(data.isSorted());
     EXPECT_EQ(shown(qvCcCues(data.pairs(), 0)),
-              "59-120 15:13:First\n"
-              "120-179 15:8:follows at once\n"
-              "209-269 14:1:comes while the one before is 15:0:being taken off the screen again\n"
+              "60-120 15:13:First\n"
+              "120-180 15:8:follows at once\n"
+              "210-270 14:1:comes while the one before is 15:0:being taken off the screen again\n"
               "599-674 14:11:Déjà vu ♪ 15:1:it’s “odd”: ½ of 100% - “all”\n");
 }
 

@@ -1,0 +1,170 @@
+#include "tarsel/commands/captionexport.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <cstdio>
+#include <memory>
+
+#include <qvplugcore/qvplugcore.h>
+
+#include "tarsel/captions/captiontext.h"
+#include "tarsel/host/console.h"
+#include "tarsel/host/files.h"
+#include "tarsel/host/outputs.h"
+#include "tarsel/source/captionfile.h"
+#include "tarsel/source/source.h"
+#include "tarsel/words/messages.h"
+#include "tarsel/words/timespec.h"
+
+namespace {
+
+struct Captions {
+    std::vector<QvCcCue> cues[2];  // of each field
+    QvFramerate rate;
+};
+
+QvFramerate dropFrame() {
+    QvFramerate rate = QvFramerate::f29p();
+    rate.setDf(true);
+    return rate;
+}
+
+bool isSubtitles(const std::string& file) {
+    const Any extension = QvFile::getExt(Any(file.c_str()), true);
+    return extension == "srt" || extension == "sub";
+}
+
+// Without "<i>" and its like.
+std::string withoutTags(const std::string& markup) {
+    std::string text;
+    for (size_t at = 0; at < markup.size(); ++at) {
+        const size_t close = markup[at] == '<' ? markup.find('>', at) : std::string::npos;
+        if (close == std::string::npos)
+            text += markup[at];
+        else
+            at = close;
+    }
+    return text;
+}
+
+QvCcCue cueOf(const QvSubtitle& subtitle) {
+    QvCcCue cue{subtitle.start, subtitle.end, {}, false};
+    const std::string text = subtitle.text.asString("");
+    for (size_t at = 0; at <= text.size();) {
+        const size_t end = std::min(text.find('|', at), text.size());
+        const std::string row = text.substr(at, end - at);
+        cue.rows.push_back({15, 0, withoutTags(row), row});
+        at = end + 1;
+    }
+    return cue;
+}
+
+void readSubtitles(const std::string& file, Captions& captions) {
+    requireInput(file);
+    QvSubtitles read;
+    QvSubtitleFindings found;
+    if (read.readFile(Any(file.c_str()), QvFramerate(QvRatio(25, 1)), 0, found) != QvStatus::ok ||
+        found.problem != QvSubtitleFindings::none)
+        throw failure(Msg::inputNoSubtitles, {file});
+    if (found.lost > 0)
+        std::fprintf(stderr, "tarsel: warning: %s\n",
+                     lineOf(Msg::captionsLost, {file, std::to_string(found.lost)}).c_str());
+    for (int i = 0; i < read.nrSubtitles(); ++i) captions.cues[0].push_back(cueOf(*read.at(i)));
+}
+
+void readScc(const std::vector<std::string>& files, const std::string& rate, Captions& captions) {
+    if (!rate.empty()) captions.rate = parseRate(rate, "--rate");
+    for (size_t field = 0; field < files.size(); ++field) {
+        requireInput(files[field]);
+        QvCcData data;
+        QvFramerate found = captions.rate;
+        if (data.readScc(Any(files[field].c_str()), static_cast<int>(field), rate.empty(), found, nullptr,
+                         true) != QvStatus::ok ||
+            data.count() == 0)
+            refuseScc(files[field]);
+        if (field == 0 || captions.rate.rate() < found.rate()) captions.rate = found;
+        captions.cues[field] = qvCcCues(data.pairs(), static_cast<int>(field));
+    }
+    printWarnings();
+    if (captions.cues[0].empty() && captions.cues[1].empty())
+        throw failure(Msg::inputNoCaptions, {files.front()});
+}
+
+std::string jsonText(const Captions& captions) {
+    struct Line {
+        const QvCcCue* cue;
+        int field;
+    };
+    std::vector<Line> lines;
+    for (const int field : {0, 1})
+        for (const QvCcCue& cue : captions.cues[field]) lines.push_back({&cue, field + 1});
+    std::stable_sort(lines.begin(), lines.end(),
+                     [](const Line& a, const Line& b) { return a.cue->start < b.cue->start; });
+    std::string text;
+    for (const Line& line : lines) text += captionJson(*line.cue, captions.rate, line.field) + "\n";
+    return text;
+}
+
+std::string sccText(const Captions& captions) {
+    QvCcLosses losses;
+    const QvCcData data = qvCcEncode(captions.cues[0], losses);
+    const auto warn = [](const std::string& line) {
+        std::fprintf(stderr, "tarsel: warning: %s\n", line.c_str());
+    };
+    if (!losses.characters.empty()) warn(lineOf(Msg::captionsLetters, {losses.characters}));
+    if (losses.cut > 0) warn(lineOf(Msg::captionsCut, {std::to_string(losses.cut)}));
+    if (losses.late > 0)
+        warn(lineOf(Msg::captionsLate, {std::to_string(losses.late), formatTime(losses.latest)}));
+    return data.sccText(captions.rate, {.dropFrameLines = true, .complete = true});
+}
+
+void save(const std::string& text, Outputs& outputs, const std::string& shown, const char* extension) {
+    const std::string name = outputs.begin(extension);
+    errno = 0;
+    std::FILE* file = std::fopen(name.c_str(), "wb");
+    bool written = file && std::fwrite(text.data(), 1, text.size(), file) == text.size();
+    int error = written ? 0 : errno;
+    if (file && std::fclose(file) != 0 && written) {
+        written = false;
+        error = errno;
+    }
+    if (!written) throw systemFailure(Msg::outputSystem, shown, error);
+    outputs.commit(extension);
+    std::fprintf(stderr, "tarsel: wrote %s\n", inQuotes(shown).c_str());
+}
+
+}  // namespace
+
+// The one form that was asked for.
+std::string CaptionExport::only() const {
+    const std::pair<bool, const char*> forms[] = {{srt, "srt"}, {vtt, "vtt"}, {scc, "scc"}, {json, "json"}};
+    std::string form;
+    for (const auto& [asked, name] : forms) {
+        if (!asked) continue;
+        if (!form.empty()) throw failure(Msg::captionsForms, {"--" + form, std::string("--") + name});
+        form = name;
+    }
+    if (files.size() > 1 && form != "json") throw failure(Msg::captionsOneFile, {"--" + form, files[1]});
+    return form;
+}
+
+std::string CaptionExport::text() const {
+    Captions captions;
+    captions.rate = dropFrame();
+    if (isSubtitles(files.front())) {
+        if (!rate.empty()) captions.rate = parseRate(rate, "--rate");
+        readSubtitles(files.front(), captions);
+    } else {
+        readScc(files, rate, captions);
+    }
+    if (srt) return srtText(captions.cues[0]);
+    if (vtt) return vttText(captions.cues[0]);
+    return scc ? sccText(captions) : jsonText(captions);
+}
+
+void CaptionExport::run() const {
+    const std::string form = only();
+    if (output.empty() || output == "-") return printText(text());
+    Outputs file(output, "-o", files, outputs.policy());
+    save(text(), file, output, form.c_str());
+}
