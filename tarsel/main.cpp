@@ -12,7 +12,7 @@
 #include "tarsel/host/console.h"
 #include "tarsel/host/files.h"
 #include "tarsel/host/memory.h"
-#include "tarsel/host/outputs.h"
+#include "tarsel/host/outputs/outputs.h"
 #include "tarsel/host/plugins.h"
 #include "tarsel/host/signals.h"
 #include "tarsel/host/terminal.h"

@@ -1,7 +1,6 @@
 #include "tarsel/commands/captionexport.h"
 
 #include <algorithm>
-#include <cerrno>
 #include <cstdio>
 #include <memory>
 
@@ -10,7 +9,7 @@
 #include "tarsel/captions/captiontext.h"
 #include "tarsel/host/console.h"
 #include "tarsel/host/files.h"
-#include "tarsel/host/outputs.h"
+#include "tarsel/host/outputs/outputs.h"
 #include "tarsel/source/captionfile.h"
 #include "tarsel/source/source.h"
 #include "tarsel/words/messages.h"
@@ -120,15 +119,7 @@ std::string sccText(const Captions& captions) {
 
 void save(const std::string& text, Outputs& outputs, const std::string& shown, const char* extension) {
     const std::string name = outputs.begin(extension);
-    errno = 0;
-    std::FILE* file = std::fopen(name.c_str(), "wb");
-    bool written = file && std::fwrite(text.data(), 1, text.size(), file) == text.size();
-    int error = written ? 0 : errno;
-    if (file && std::fclose(file) != 0 && written) {
-        written = false;
-        error = errno;
-    }
-    if (!written) throw systemFailure(Msg::outputSystem, shown, error);
+    if (const int error = writeFile(name, text)) throw systemFailure(Msg::outputSystem, shown, error);
     outputs.commit(extension);
     std::fprintf(stderr, "tarsel: wrote %s\n", inQuotes(shown).c_str());
 }

@@ -6,9 +6,9 @@
 
 #include "tarsel/commands/commands.h"
 #include "tarsel/commands/outputoptions.h"
-#include "tarsel/host/outputs.h"
+#include "tarsel/host/outputs/outputs.h"
+#include "tarsel/host/outputs/streamoutput.h"
 #include "tarsel/host/signals.h"
-#include "tarsel/host/streamoutput.h"
 #include "tarsel/picture/picturereader.h"
 #include "tarsel/source/source.h"
 #include "tarsel/words/commandline.h"

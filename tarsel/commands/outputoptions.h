@@ -3,7 +3,7 @@
 
 #include <string>
 
-#include "tarsel/host/outputs.h"
+#include "tarsel/host/outputs/outputs.h"
 
 class Command;
 

@@ -5,7 +5,7 @@
 
 #include "tarsel/commands/commands.h"
 #include "tarsel/host/files.h"
-#include "tarsel/host/recovery.h"
+#include "tarsel/host/outputs/recovery.h"
 #include "tarsel/words/commandline.h"
 #include "tarsel/words/messages.h"
 

@@ -97,3 +97,12 @@ long long fileBytes(const std::string& name) {
     const auto size = fs::file_size(name, error);
     return error ? -1 : static_cast<long long>(size);
 }
+
+int writeFile(const std::string& name, const std::string& text) {
+    std::FILE* file = std::fopen(name.c_str(), "wb");
+    if (!file) return errno;
+    const bool taken = std::fwrite(text.data(), 1, text.size(), file) == text.size();
+    const int error = errno;
+    if (std::fclose(file) != 0 && taken) return errno;
+    return taken ? 0 : error;
+}

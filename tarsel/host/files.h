@@ -31,4 +31,6 @@ bool isRegularFile(const std::string& name);
 bool isDevice(const std::string& name);
 // Whether both names lead, or would lead, to one place.
 bool samePlace(const std::string& first, const std::string& second);
+// Makes the file, or empties it, and writes `text`. 0 or an errno.
+int writeFile(const std::string& name, const std::string& text);
 long long fileBytes(const std::string& name);  // -1 if there is no such file

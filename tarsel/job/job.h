@@ -9,9 +9,9 @@
 
 #include <qvplugcore/qvplugcore.h>
 
-#include "tarsel/host/outputs.h"
+#include "tarsel/host/outputs/outputs.h"
+#include "tarsel/host/outputs/streamoutput.h"
 #include "tarsel/host/signals.h"
-#include "tarsel/host/streamoutput.h"
 #include "tarsel/job/progress.h"
 #include "tarsel/picture/picture.h"
 #include "tarsel/source/source.h"

@@ -8,7 +8,7 @@
 
 #include <qvplugcore/qvplugcore.h>
 
-#include "tarsel/host/outputs.h"
+#include "tarsel/host/outputs/outputs.h"
 #include "tarsel/picture/effects.h"
 #include "tarsel/source/source.h"
 

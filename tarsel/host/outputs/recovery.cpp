@@ -1,4 +1,4 @@
-#include "tarsel/host/recovery.h"
+#include "tarsel/host/outputs/recovery.h"
 
 #include <algorithm>
 #include <cerrno>
@@ -11,11 +11,11 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include "tarsel/host/foldercalls.h"
-#include "tarsel/host/manifest.h"
-#include "tarsel/host/owner.h"
-#include "tarsel/host/placement.h"
-#include "tarsel/host/workfolder.h"
+#include "tarsel/host/outputs/foldercalls.h"
+#include "tarsel/host/outputs/manifest.h"
+#include "tarsel/host/outputs/owner.h"
+#include "tarsel/host/outputs/placement.h"
+#include "tarsel/host/outputs/workfolder.h"
 #include "tarsel/words/failure.h"
 #include "tarsel/words/messages.h"
 #include "tarsel/words/timespec.h"

@@ -1,4 +1,4 @@
-#include "tarsel/host/workfolder.h"
+#include "tarsel/host/outputs/workfolder.h"
 
 #include <cerrno>
 #include <cstring>
@@ -11,9 +11,9 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include "tarsel/host/foldercalls.h"
-#include "tarsel/host/manifest.h"
-#include "tarsel/host/owner.h"
+#include "tarsel/host/outputs/foldercalls.h"
+#include "tarsel/host/outputs/manifest.h"
+#include "tarsel/host/outputs/owner.h"
 
 namespace {
 

@@ -9,9 +9,9 @@
 #include <string>
 #include <vector>
 
-#include "tarsel/host/manifest.h"
-#include "tarsel/host/placement.h"
-#include "tarsel/host/workfolder.h"
+#include "tarsel/host/outputs/manifest.h"
+#include "tarsel/host/outputs/placement.h"
+#include "tarsel/host/outputs/workfolder.h"
 
 // How results may be written.
 struct OutputPolicy {

@@ -1,4 +1,4 @@
-#include "tarsel/host/owner.h"
+#include "tarsel/host/outputs/owner.h"
 
 #include <cerrno>
 #include <charconv>
@@ -8,7 +8,7 @@
 #include <signal.h>
 #include <unistd.h>
 
-#include "tarsel/host/foldercalls.h"
+#include "tarsel/host/outputs/foldercalls.h"
 
 namespace {
 

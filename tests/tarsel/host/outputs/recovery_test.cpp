@@ -1,5 +1,5 @@
 // What is done with work folders that are found: by their owner, and by a manifest that may be anything.
-#include "tarsel/host/recovery.h"
+#include "tarsel/host/outputs/recovery.h"
 
 #include <gtest/gtest.h>
 
@@ -10,8 +10,8 @@
 #include <sys/file.h>
 #include <sys/stat.h>
 
-#include "tarsel/host/manifest.h"
-#include "tarsel/host/owner.h"
+#include "tarsel/host/outputs/manifest.h"
+#include "tarsel/host/outputs/owner.h"
 #include "tests/support/child.h"
 #include "tests/support/temp_folder.h"
 

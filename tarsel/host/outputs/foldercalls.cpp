@@ -1,4 +1,4 @@
-#include "tarsel/host/foldercalls.h"
+#include "tarsel/host/outputs/foldercalls.h"
 
 #include <cerrno>
 #include <cstdio>
@@ -9,7 +9,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include "tarsel/host/descriptor.h"
+#include "tarsel/host/outputs/descriptor.h"
 
 namespace {
 

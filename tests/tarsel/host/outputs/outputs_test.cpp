@@ -1,12 +1,12 @@
 // Results get their names as a whole, whatever ends the run or fails in between.
-#include "tarsel/host/outputs.h"
+#include "tarsel/host/outputs/outputs.h"
 
 #include <gtest/gtest.h>
 
 #include <map>
 #include <span>
 
-#include "tarsel/host/recovery.h"
+#include "tarsel/host/outputs/recovery.h"
 #include "tarsel/words/failure.h"
 #include "tests/support/child.h"
 #include "tests/support/temp_folder.h"

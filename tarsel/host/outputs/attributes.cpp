@@ -1,4 +1,4 @@
-#include "tarsel/host/attributes.h"
+#include "tarsel/host/outputs/attributes.h"
 
 #include <cerrno>
 #include <string>
@@ -8,7 +8,7 @@
 #include <sys/xattr.h>
 #include <unistd.h>
 
-#include "tarsel/host/descriptor.h"
+#include "tarsel/host/outputs/descriptor.h"
 
 namespace {
 

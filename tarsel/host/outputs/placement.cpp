@@ -1,8 +1,8 @@
-#include "tarsel/host/placement.h"
+#include "tarsel/host/outputs/placement.h"
 
 #include <cerrno>
 
-#include "tarsel/host/foldercalls.h"
+#include "tarsel/host/outputs/foldercalls.h"
 
 PlaceResult placeOne(int work, int place, const Manifest::Row& row, bool overwrite, bool sync) {
     const char *hidden = row.hidden.c_str(), *name = row.name.c_str();

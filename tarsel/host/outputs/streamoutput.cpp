@@ -1,4 +1,4 @@
-#include "tarsel/host/streamoutput.h"
+#include "tarsel/host/outputs/streamoutput.h"
 
 #include <filesystem>
 

@@ -1,10 +1,10 @@
-#include "tarsel/host/manifest.h"
+#include "tarsel/host/outputs/manifest.h"
 
 #include <cstdint>
 #include <cstdio>
 #include <set>
 
-#include "tarsel/host/foldercalls.h"
+#include "tarsel/host/outputs/foldercalls.h"
 
 namespace {
 

@@ -4,7 +4,7 @@
 
 #include <string_view>
 
-#include "tarsel/host/manifest.h"
+#include "tarsel/host/outputs/manifest.h"
 
 // What happened to a placement that failed.
 struct PlaceResult {

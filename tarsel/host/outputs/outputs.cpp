@@ -1,4 +1,4 @@
-#include "tarsel/host/outputs.h"
+#include "tarsel/host/outputs/outputs.h"
 
 #include <algorithm>
 #include <cerrno>
@@ -8,9 +8,9 @@
 
 #include <unistd.h>
 
-#include "tarsel/host/attributes.h"
-#include "tarsel/host/foldercalls.h"
-#include "tarsel/host/recovery.h"
+#include "tarsel/host/outputs/attributes.h"
+#include "tarsel/host/outputs/foldercalls.h"
+#include "tarsel/host/outputs/recovery.h"
 #include "tarsel/words/failure.h"
 #include "tarsel/words/messages.h"
 
