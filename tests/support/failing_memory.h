@@ -52,4 +52,5 @@ QV_NEW_APART void* operator new[](std::size_t bytes, std::align_val_t align, con
 }
 QV_NEW_APART void operator delete(void* block) noexcept { std::free(block); }
 QV_NEW_APART void operator delete(void* block, std::size_t) noexcept { std::free(block); }
+QV_NEW_APART void operator delete(void* block, const std::nothrow_t&) noexcept { std::free(block); }
 QV_NEW_APART void operator delete[](void* block, std::align_val_t) noexcept { std::free(block); }

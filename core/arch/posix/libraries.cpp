@@ -63,6 +63,14 @@ QvLibrary checkContents(const std::string& name) {
     return {nullptr, fault.empty() ? QvLibraryFault::none : QvLibraryFault::invalid, fault};
 }
 
+// A library that lets an exception out of its start ends the program: the loader would keep its lock, and the
+// next library would wait for ever. dlopen says that it throws nothing, so that a compiler may leave the
+// guard out where it is called by its name.
+void* start(const char* name) noexcept {
+    void* (*volatile const load)(const char*, int) = dlopen;
+    return load(name, RTLD_NOW | RTLD_LOCAL);
+}
+
 class Loader {
   public:
     Loader(QvLibraryTrust trust, const std::string& name) : trust_(trust) {
@@ -89,7 +97,7 @@ class Loader {
         std::vector<void*> dependencies;
         QvLibrary result;
         for (std::string last;;) {
-            result.handle = dlopen(name.c_str(), RTLD_NOW | RTLD_LOCAL);
+            result.handle = start(name.c_str());
             if (result.handle) break;
             const char* const message = dlerror();
             const std::string missing = missingDependency(message ? message : "");
