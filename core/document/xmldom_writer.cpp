@@ -75,6 +75,7 @@ class Writer {
         }
         flush();
     }
+    bool failed() const { return failed_; }  // the stream has not taken all
 
   private:
     struct Level {
@@ -85,6 +86,7 @@ class Writer {
     std::FILE* stream_;
     int indent_;
     std::string out_;
+    bool failed_ = false;
     std::vector<Level> path_;  // elements whose children are being written
 
     void indent() { out_.append(2 * (static_cast<std::size_t>(indent_) + path_.size()), ' '); }
@@ -116,7 +118,7 @@ class Writer {
     }
 
     void flush() {
-        std::fwrite(out_.data(), 1, out_.size(), stream_);
+        failed_ |= std::fwrite(out_.data(), 1, out_.size(), stream_) != out_.size();
         out_.clear();
     }
 };
@@ -175,8 +177,9 @@ bool qvIsXmlName(const char* name) {
 int XmlNode::write(void* stream, int indent) const {
     if (!name()) return -1;
     QV_ASSERT(stream && indent >= 0);
-    Writer(static_cast<std::FILE*>(stream), indent).write(*this);
-    return 0;
+    Writer writer(static_cast<std::FILE*>(stream), indent);
+    writer.write(*this);
+    return writer.failed() ? -1 : 0;
 }
 
 int XmlParser::storeXmlTree(const Any& path, XmlNode* root, const char* doctype) {
@@ -189,8 +192,8 @@ int XmlParser::storeXmlTree(const Any& path, XmlNode* root, const char* doctype)
 
     std::fputs("<?xml version=\"1.0\" encoding=\"UTF-8\" ?>\n", stream);
     if (doctype) std::fprintf(stream, "<!DOCTYPE %s>\n", doctype);
-    root->write(stream, 0);
-    const bool failed = std::fflush(stream) != 0 || std::ferror(stream);
+    const bool taken = root->write(stream, 0) == 0;
+    const bool failed = !taken || std::fflush(stream) != 0 || std::ferror(stream);
     const bool closed = isStandard(stream) || std::fclose(stream) == 0;
     if (failed || !closed)
         throw QvFileException(Any::sprintf("Can not write '%s'", name.asString("")).asString());

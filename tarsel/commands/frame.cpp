@@ -57,11 +57,13 @@ class Shrinker {
 
 void save(const QvFrame& picture, const Given& given) {
     Outputs* const outputs = given.outputs.get();
-    const auto leave = [&] {
-        if (outputs) outputs->discard();
-        return outputs && outputs->placed();
+    const auto leave = [outputs] {
+        outputs->discard();
+        return outputs->placed();
     };
-    const Signals::Watch watch(*given.signals, {.first = {}, .second = leave, .report = {}});
+    Signals::Handlers handlers;
+    if (outputs) handlers.second = leave;
+    const Signals::Watch watch(*given.signals, std::move(handlers));
     const std::string name = outputs ? outputs->begin("png") : given.stream->engineName();
     if (picture.four_cc() != QvFourcc::BGR3) makeAnyCodec("scaler", kVideoFilter);  // says that it is missing
     errno = 0;

@@ -8,6 +8,7 @@
 #include <signal.h>
 #include <unistd.h>
 
+#include "tarsel/host/terminal.h"
 #include "tarsel/words/messages.h"
 
 namespace {
@@ -54,6 +55,8 @@ void Signals::stop(int signal) {
     if (g_complete && !again) return;
     if (!again && now.first) return now.first(signal);
     const bool complete = g_complete || (now.second && now.second());
+    if (!again && !complete)
+        writeToStderr(now.second ? "tarsel: stopped; nothing was left behind\n" : "tarsel: stopped\n");
     _exit(static_cast<int>(complete ? Exit::done : statusOf(signal)));
 }
 

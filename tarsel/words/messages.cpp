@@ -152,6 +152,7 @@ constexpr Message kMessages[] = {
     {Msg::outputIsOutput,      Exit::output, "can't write {file}",                 "it is also the output of the job",                             "give one of them another name"},
     {Msg::outputTwice,         Exit::usage,  "can't write {file}",                 "two files of this job would have this name",                   "give -o the extension of its format"},
     {Msg::outputFolderAbsent,  Exit::output, "can't write {file}",                 "the folder {file} does not exist",                             "make the folder first"},
+    {Msg::outputFolderGone,    Exit::output, "can't write {file}",                 "its folder was removed while the job ran",                     "run it again"},
     {Msg::outputFormatUnknown, Exit::usage,  "-o {file}",                          "no output has the extension {name}",                           "name its format with --format, 'tarsel formats' lists all{text}"},
     {Msg::outputFormatMissing, Exit::usage,  "-o {file}",                          "no extension says what to write",                              "name its format with --format, 'tarsel formats' lists all"},
     {Msg::formatUnknown,       Exit::usage,  "--format",                           "there is no format {name}",                                    "'tarsel formats' lists all{text}"},

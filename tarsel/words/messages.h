@@ -152,6 +152,7 @@ enum class Msg : unsigned char {
     outputIsOutput,
     outputTwice,
     outputFolderAbsent,
+    outputFolderGone,
     outputFormatUnknown,
     outputFormatMissing,
     formatUnknown,

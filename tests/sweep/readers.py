@@ -14,7 +14,7 @@ from runner import Box, crashed
 TOOLS = "ffmpeg", "ffprobe", "sox", "pngcheck", "pngfix"
 # Pixel format of the tool, and what ffmpeg calls the same samples in a raw file.
 RAW_FORMATS = {"BGR3": "bgr24", "BGR4": "bgr0", "I420": "yuv420p", "YUYV": "yuyv422", "UYVY": "uyvy422",
-               "Y216": None, "YV12": None, "v210": None}
+               "YV12": None, "v210": None}
 
 
 def unsound(name, data):
@@ -136,10 +136,6 @@ def check_avi(box):
             frames = [raw[at:at + size] for at in range(0, len(raw), size)]
             (box.work / "card.raw").write_bytes(b"".join(f[:y] + f[y * 5 // 4:] + f[y:y * 5 // 4] for f in frames))
             before, named = ["-f", "rawvideo", "-pix_fmt", "yuv420p", "-s", "64x48"], "yuv420p"
-        elif pixel == "Y216":  # 16 bits, which no raw format of ffmpeg's has: only that it is read
-            if b"codec_type=video" not in read(box, "ffprobe", "-v", "error", "-show_streams", "card.avi"):
-                raise Unlike("no pictures in card.avi")
-            continue
         else:
             before = ["-f", "rawvideo", "-pix_fmt", named, "-s", "64x48"]
         out = "bgr24" if pixel == "BGR4" else named

@@ -46,6 +46,11 @@ bool entryExists(int folder, const char* name) {
     return fstatat(folder, name, &status, AT_SYMLINK_NOFOLLOW) == 0;
 }
 
+bool isRemoved(int folder) {
+    struct stat status;
+    return fstat(folder, &status) == 0 && status.st_nlink == 0;
+}
+
 int listFolder(int folder, std::vector<std::string>& names) {
     // A further descriptor, so that the place in the listing is its own.
     Descriptor own(openat(folder, ".", O_RDONLY | O_DIRECTORY | O_CLOEXEC));

@@ -12,6 +12,8 @@ int openFolder(const char* name);
 // Whether `name` is one entry of a folder: not empty, no "/", neither "." nor "..".
 bool isEntryName(std::string_view name);
 bool entryExists(int folder, const char* name);
+// Whether the open folder has been removed.
+bool isRemoved(int folder);
 // All entries but "." and "..".
 int listFolder(int folder, std::vector<std::string>& names);
 

@@ -197,6 +197,7 @@ std::vector<fs::path> Outputs::written() const {
     if (device_ || !work_) return files;
     std::vector<std::string> names;
     if (const int error = listFolder(work_.handle(), names)) refuse(output_, inLine(std::strerror(error)));
+    if (isRemoved(work_.handle())) throw failure(Msg::outputFolderGone, {output_.string()});
     for (const auto& name : names)
         if (name.rfind(kBase, 0) == 0) files.push_back(fs::path(work_.path()) / name);
     std::sort(files.begin(), files.end());
@@ -225,7 +226,8 @@ std::vector<std::string> Outputs::formerSet(const std::vector<Manifest::Row>& fr
     const bool pictures = std::any_of(shapes.begin(), shapes.end(), isPicture);
     bool hadPictures = false;
     std::vector<std::string> all, sound;
-    listFolder(work_.place(), all);
+    if (const int error = listFolder(work_.place(), all))
+        throw failure(Msg::outputNotPlaced, {output_.string(), std::strerror(error)});
     for (const auto& name : all) {
         if (name.rfind(stem, 0) != 0) continue;
         const std::string shape = ending(name);
