@@ -45,8 +45,8 @@ int main() {
     const TempFolder folder;
     const std::string in = folder.file("in.yuv");
     writePictures(in);
-    const std::string ours = QV_TOOL " transcode -q -y --no-sync --raw size=1920x1080,pixel=I420,rate=25 '" + in +
-                             "' --size 1280x720 -o '" + (folder.file("ours.yuv")) + "'";
+    const std::string ours = QV_TOOL " transcode -q -y --no-sync --raw size=1920x1080,pixel=I420,rate=25 '" +
+                             in + "' --size 1280x720 -o '" + (folder.file("ours.yuv")) + "'";
     const std::string peer =
         "ffmpeg -nostdin -v error -y -f rawvideo -pix_fmt yuv420p -s 1920x1080 -r 25 -i '" + in +
         "' -vf scale=1280:720:flags=bicubic -f rawvideo '" + (folder.file("peer.yuv")) + "'";

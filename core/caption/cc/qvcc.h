@@ -148,7 +148,8 @@ class QV_API QvCcData {
     // Writes all pairs, whatever their type, a run of equal times as one line. 0; -1 for a file that can't be
     // written. An assertion, with no file touched, for a line of more than 1000 pairs.
     int writeScc(const Any& filename, const QvFramerate& rate, const QvSccWriting& options = {}) const;
-    std::string sccText(const QvFramerate& rate, const QvSccWriting& options = {}) const;  // the same, as text
+    std::string sccText(const QvFramerate& rate,
+                        const QvSccWriting& options = {}) const;  // the same, as text
 
     bool operator==(const QvCcData&) const = default;
 
