@@ -89,6 +89,8 @@ int run(int argc, char** argv) {
 // Where memory is so short that not even the way out has enough, nothing half-done may stay behind.
 [[noreturn]] void breakOff() {
     blameLoadingPlugin("an exception left its start");
+    // The result has its name; what could not be put away changes nothing.
+    if (Signals::isComplete()) leave(status(Exit::done));
     const bool abandoned = Outputs::abandonAll();
     const char* reason = MemoryWatch(0).ranOut() ? "tarsel: out of memory" : "tarsel: an internal error";
     try {

@@ -16,7 +16,7 @@ namespace {
 std::atomic<int> g_received{0};
 std::mutex g_lock;                            // held while a handler runs
 const Signals::Watch* g_innermost = nullptr;  // guarded by g_lock
-bool g_complete = false;                      // likewise
+std::atomic<bool> g_complete{false};
 
 sigset_t handledSignals() {
     sigset_t set;
@@ -100,3 +100,5 @@ void Signals::complete() {
     std::lock_guard guard(g_lock);
     g_complete = true;
 }
+
+bool Signals::isComplete() { return g_complete; }

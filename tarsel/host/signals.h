@@ -47,6 +47,7 @@ class Signals {
     // The result has its name, and no signal changes the status any more: the first is ignored, so that what
     // is left to say is said, and the next one ends the process with status 0.
     void complete();
+    static bool isComplete();  // takes no lock
 
   private:
     static void wait();

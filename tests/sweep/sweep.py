@@ -14,6 +14,7 @@ import concurrent.futures
 import os
 import pathlib
 import random
+import signal
 import subprocess
 import sys
 import tempfile
@@ -130,6 +131,8 @@ def arguments():
 
 def main():
     chosen = arguments()
+    # In the background of a shell it is ignored, and the tool leaves ignored what it finds so.
+    signal.signal(signal.SIGINT, signal.default_int_handler)
     build, started = pathlib.Path(chosen.build).resolve(), time.monotonic()
     tool, built = (build, None) if build.is_file() else (build / "bin" / "tarsel", build / "sweep")
     memory = "/dev/shm" if os.access("/dev/shm", os.W_OK) else None  # syncs are quick there

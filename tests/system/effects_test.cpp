@@ -175,7 +175,7 @@ TEST_F(Effects, WhatCanNotBeDoneIsTold) {
 TEST_F(Effects, AFilterThatFailsFailsTheJob) {
     const Words job{"transcode", "testgen:size=64x48,duration=0.4,audio=0"};
     const Words toI422{"--pixel", "I422", "--filter", "scaler:outWidth=64,outHeight=48,FOURCC=I422,_front=1"};
-    folder.write("precious", "precious");
+    folder.write("precious.yuv", "precious");
     makeOverlays();
     const struct {
         int status;
@@ -185,7 +185,7 @@ TEST_F(Effects, AFilterThatFailsFailsTheJob) {
         {4, {"--filter", "rawdump:filename=/dev/full", "-o", "x.avi"}, {"rawdump", "/dev/full"}},
         {4, {"--filter", "rawdump:filename=/dev/full", "--muxer", "nullmux"}, {"rawdump", "/dev/full"}},
         {4, {"--filter", "rawdump:filename=no/x", "-o", "x.avi"}, {"'no/x'", "'no' does not exist"}},
-        {4, {"--filter", "rawdump:filename=precious", "-o", "x.avi"}, {"'precious'", "exists"}},
+        {4, {"--filter", "rawdump:filename=precious.yuv", "-o", "x.avi"}, {"'precious.yuv'", "exists"}},
         {2, {"--filter", "rawdump", "-o", "x.avi"}, {"rawdump", "none is named"}},
         {4, {"--filter", "rawdump:filename=x.avi", "-o", "x.avi"}, {"'x.avi'", "output"}},
         {4, {"--filter", "logo:filename=l.png", "-o", "l.png", "-y"}, {"'l.png'", "input"}},
@@ -198,8 +198,8 @@ TEST_F(Effects, AFilterThatFailsFailsTheJob) {
     fails(4, asYuv({"transcode", "clip.yuv", "--filter", "rawdump:filename=./clip.yuv", "-o", "x.yuv", "-y"}),
           {"'./clip.yuv'", "also an input"});
     EXPECT_TRUE(clip == contents("clip.yuv"));
-    works(asYuv({"transcode", "clip.yuv", "--filter", "rawdump:filename=precious", "-o", "x.yuv", "-y"}));
-    EXPECT_TRUE(clip == contents("precious"));
+    works(asYuv({"transcode", "clip.yuv", "--filter", "rawdump:filename=precious.yuv", "-o", "x.yuv", "-y"}));
+    EXPECT_TRUE(clip == contents("precious.yuv"));
 }
 
 // Chroma with as many rows as luma, and a box that is nobody's choice.

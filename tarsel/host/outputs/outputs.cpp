@@ -11,6 +11,7 @@
 #include "tarsel/host/outputs/attributes.h"
 #include "tarsel/host/outputs/foldercalls.h"
 #include "tarsel/host/outputs/recovery.h"
+#include "tarsel/host/outputs/streamoutput.h"
 #include "tarsel/words/failure.h"
 #include "tarsel/words/messages.h"
 
@@ -39,12 +40,12 @@ bool sameFile(const fs::path& a, const fs::path& b) {
     return fs::equivalent(a, b, error) && !error;
 }
 
-// The standard output may be a plain file that the shell has opened: it is written as a stream all the same.
+// A redirected stream may be a plain file that the shell has opened: it is written as a stream all the same.
 bool takesStream(const fs::path& name) {
     std::error_code error;
     const auto status = fs::status(name, error);
     if (!fs::exists(status) || fs::is_directory(status)) return false;
-    return !fs::is_regular_file(status) || name.string().rfind("/dev/", 0) == 0;
+    return !fs::is_regular_file(status) || StreamOutput::namesDescriptor(name.string());
 }
 
 void checkFolder(const fs::path& name) {
@@ -187,7 +188,8 @@ std::string Outputs::begin(const std::string& extension) {
 
 std::string Outputs::finalName(const fs::path& written, const std::string& from) const {
     const std::string rest = written.filename().string().substr(kBase.size());
-    fs::path name = output_.stem();
+    // What was begun without an extension keeps the whole name.
+    fs::path name = rest.empty() ? output_.filename() : output_.stem();
     name += rest == "." + from ? output_.extension().string() : rest;
     return (output_.has_parent_path() ? output_.parent_path() / name : name).string();
 }

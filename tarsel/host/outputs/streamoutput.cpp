@@ -15,13 +15,6 @@ namespace {
 
 constexpr const char* kStandard = "/dev/stdout";
 
-// The shell's redirection makes a file of these, which is written as a stream all the same.
-bool namesDescriptor(const std::string& name) {
-    for (const char* start : {"/dev/stdout", "/dev/stderr", "/dev/fd/", "/proc/self/fd/"})
-        if (name.rfind(start, 0) == 0) return true;
-    return false;
-}
-
 bool isNullDevice(const struct stat& facts) {
     return S_ISCHR(facts.st_mode) && major(facts.st_rdev) == 1 && minor(facts.st_rdev) == 3;
 }
@@ -32,6 +25,12 @@ bool sameFile(const std::string& first, const std::string& second) {
 }
 
 }  // namespace
+
+bool StreamOutput::namesDescriptor(const std::string& name) {
+    for (const char* start : {"/dev/fd/", "/proc/self/fd/"})
+        if (name.rfind(start, 0) == 0) return true;
+    return name == kStandard || name == "/dev/stderr" || name == "/dev/stdin";
+}
 
 std::unique_ptr<StreamOutput> StreamOutput::find(const std::string& output,
                                                  const std::vector<std::string>& inputs) {

@@ -8,6 +8,9 @@
 
 class StreamOutput {
   public:
+    // Names of open files: the shell's redirection makes a plain file of them, which is written as a stream
+    // all the same.
+    static bool namesDescriptor(const std::string& name);
     // What `output` is when it is no file, null when it is or will be one. "-" is the standard output. Throws
     // Failure for a standard output that is closed or a terminal, and for one that goes into one of `inputs`.
     static std::unique_ptr<StreamOutput> find(const std::string& output,
