@@ -1,6 +1,7 @@
 #include "builtin/builtinmodule.h"
 
 #include <algorithm>
+#include <memory>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -51,6 +52,8 @@ QvBuiltinModule::QvBuiltinModule(const QvBuiltinRow& row)
 }
 
 QvCodec* QvBuiltinModule::create() {
-    QvCodec* codec = row_.create ? row_.create() : nullptr;
-    return codec ? _setAttrs(codec) : nullptr;
+    std::unique_ptr<QvCodec> codec(row_.create ? row_.create() : nullptr);
+    if (!codec) return nullptr;
+    _setAttrs(codec.get());
+    return codec.release();
 }
