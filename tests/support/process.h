@@ -112,6 +112,7 @@ class Process {
             setrlimit(RLIMIT_FSIZE, &limit);
         }
         std::signal(SIGHUP, options.ignoreHangup ? SIG_IGN : SIG_DFL);
+        std::signal(SIGINT, SIG_DFL);  // a shell's background ignores it
         std::vector<char*> arguments;
         for (const auto& word : words) arguments.push_back(const_cast<char*>(word.c_str()));
         arguments.push_back(nullptr);

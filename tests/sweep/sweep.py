@@ -131,8 +131,9 @@ def arguments():
 
 def main():
     chosen = arguments()
-    # In the background of a shell it is ignored, and the tool leaves ignored what it finds so.
+    # A shell in the background ignores the one, nohup the other, and the tool leaves ignored what it finds so.
     signal.signal(signal.SIGINT, signal.default_int_handler)
+    signal.signal(signal.SIGHUP, signal.SIG_DFL)
     build, started = pathlib.Path(chosen.build).resolve(), time.monotonic()
     tool, built = (build, None) if build.is_file() else (build / "bin" / "tarsel", build / "sweep")
     memory = "/dev/shm" if os.access("/dev/shm", os.W_OK) else None  # syncs are quick there
