@@ -30,5 +30,5 @@ class QvBuiltinModule : public QvModule {
     const QvBuiltinRow& row_;
 };
 
-// The row of a name, also of modules that are not registered. Asserts if there is none.
+// The row of a name, also of modules that are not registered. Asserts if the table has no such row.
 const QvBuiltinRow& qvBuiltinRow(const char* name);

@@ -1,10 +1,10 @@
-// Decoder "rawdec": frames of a known format that lie one behind the other in a plain file.
+// Decoder "rawdec": frames of a known format, one after the other in a plain file.
 //
 //     | offset | frame 0 | frame 1 | ... | frame n-1 | rest of less than a frame, never read
 //
 // A frame's bytes are the planes of its FOURCC at their default strides. "BGR6" (16 bits a component, the
 // high byte at odd positions), "BGRU" (three bytes a pixel, rows without padding) and "v210" (delivered as
-// Y216) are known beside the formats of QvFrame. A rest behind the last frame shows as "truncated" in the
+// Y216) are known beside the formats of QvFrame. A rest after the last frame shows as "truncated" in the
 // stream's parameters.
 //
 // Parameters: "filename", "FOURCC" or "extendedFOURCC" (Int32, or String of four characters; default
@@ -93,7 +93,7 @@ class RawDecoder : public QvDecodePipe {
 
     bool isFieldFile() const { return settings_.fieldOrderFile && settings_.framerate.interlaced() != 0; }
     long long frameBytes() const;  // in the file; 0 without a frame
-    long long payload() const;     // bytes behind the offset
+    long long payload() const;     // bytes after the offset
     double frameAspect() const;
 
     int readNext();

@@ -64,7 +64,7 @@ class SccDec : public BaseDecodePipe {
     int seek(const MediaTime& time, int type, int stream) override;
     // Any frame number can be read: outside the captions there are none.
     int seekToFrame(long long frame, int stream) override;
-    // QvStatus::endOfStream behind the last pair.
+    // QvStatus::endOfStream after the last pair.
     int readFrame(int stream) override;
     // The pairs of the frame just read; -1 when it has none. `kind` has no meaning.
     int readMeta(int stream, int kind, AnyDict& out) override;

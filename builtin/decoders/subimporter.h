@@ -45,7 +45,7 @@ class SubImporter : public BaseDecodePipe {
     int deselect(int type, int stream) override;
     int seek(const MediaTime& time, int type, int stream) override;
     int seekToFrame(long long frame, int stream) override;
-    // 0, or QvStatus::endOfStream behind the end of the last entry.
+    // 0, or QvStatus::endOfStream after the end of the last entry.
     int readFrame(int stream) override;
     // Sets "name" ("subtitle"), "text", "rows", "start", "end" of what is shown in the frame that was read,
     // and "format". -1 if nothing is.

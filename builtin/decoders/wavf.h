@@ -18,7 +18,7 @@ enum class WavStatus {
     notPcm = 2,     // neither PCM nor extensible PCM
     badFormat = 3,  // a count of channels, a rate or a width that can't be read
     cannotParse = 4,
-    noData = 9,  // no "data" near behind the format; counts as one that can't be parsed
+    noData = 9,  // no "data" soon after the format; counts as one that can't be parsed
 };
 
 struct WavHeader {

@@ -14,10 +14,10 @@
 
 class QvVideoFilter;
 
-// Each frame goes to the output as the planes of its type, one behind the other with the default strides,
+// Each frame goes to the output as the planes of its type, one after the other, with the default strides,
 // and is announced as one access unit. Type v210 takes Y216 frames and converts them.
 //
-// With "accelerationOn" a worker writes behind a queue of three frames: writeFrame copies the frame there and
+// With "accelerationOn" a worker writes from a queue of three frames: writeFrame copies the frame there and
 // waits only while all three are taken. A failure of the worker is the result of the next writeFrame and of
 // close.
 class RawVideoEnc : public QvVideoEncoder {

@@ -1,4 +1,4 @@
-// Little-endian fields and nested chunks of RIFF, one behind the other.
+// Little-endian fields and nested chunks of RIFF, one after the other.
 #pragma once
 
 #include <cstdint>
@@ -33,7 +33,7 @@ class AviBytes {
         return *this;
     }
 
-    // The length of a chunk is filled in by close(), with the padding behind an odd one.
+    // The length of a chunk is filled in by close(), with the padding after an odd one.
     size_t open(const char (&fourLetters)[5]) {
         text(fourLetters).u32(0);
         return data_.size();

@@ -6,7 +6,7 @@
 #include <optional>
 #include <vector>
 
-// A frame comes as an encoder puts it out, its planes one behind the other with the default strides; the file
+// A frame comes as an encoder puts it out, its planes one after the other with the default strides; the file
 // has its own conventions:
 //
 //     BGR3, BGR4, BGRA        bottom-up, rows padded with zeros to 4 bytes
@@ -16,13 +16,13 @@
 //                             column or row
 //     v210                    top-down, as they come
 //
-// Y216 is none of them: readers take files of that tag for samples of 14 bits.
+// Y216 is not among them: readers take files of that tag for samples of 14 bits.
 class AviPicture {
   public:
     using Put = std::function<bool(const unsigned char* data, size_t bytes)>;
 
     AviPicture() = default;  // of nothing
-    // None for a type that AVI does not hold, and for a size that is none.
+    // None for a type that AVI does not hold, and for a width or height below 1.
     static std::optional<AviPicture> of(unsigned fourcc, int width, int height);
 
     int width() const { return width_; }

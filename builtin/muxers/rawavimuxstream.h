@@ -11,8 +11,8 @@
 #include "core/arch/widename.h"
 #include "core/stream/qvbufstrm.h"
 
-// Pictures are written when they come. Sound is gathered, and written before the first picture that lies
-// behind it, so that each picture is followed by the sound of its time; sound that runs ahead of the pictures
+// Pictures are written when they come. Sound is gathered, and written before the first picture that is
+// later, so that each picture is followed by the sound of its time; sound that runs ahead of the pictures
 // goes out when half a second of it has gathered. Encoders may write from threads of their own.
 class AviInterleaver {
   public:

@@ -13,7 +13,7 @@ constexpr char rawWriteThrough[] = "writeThrough";
 enum class RawPutResult {
     ok,
     noBlock,  // the stream gave no room, for no known reason; `RawOutput::asked` tells for how much
-    failed,   // what stands behind the stream could not write: RawOutput::fault
+    failed,   // the target of the stream could not write: RawOutput::fault
 };
 
 // Holds the lock of the stream for as long as it lives.
@@ -26,7 +26,7 @@ class RawOutput {
 
     RawPutResult put(const unsigned char* data, uint64_t bytes);
     unsigned asked() const { return asked_; }
-    // False when what stands behind the stream has failed since it was opened. Some streams find out only
+    // False when the target of the stream has failed since it was opened. Some streams find out only
     // when a unit is announced.
     bool sound() const;
     std::string fault() const;

@@ -25,7 +25,7 @@ class QV_API QvCancel {
 
     // For the writer. Nanoseconds of the grace that are left; all of it before a request.
     long long graceLeft() const;
-    // Readable from a request on; made by the first call, so that who writes regular files needs none. -1
+    // Readable from a request on; made by the first call, so that a writer of regular files needs none. -1
     // with errno when the system has none left.
     int descriptor();
     // Whether a write or an opening was given up since clear().

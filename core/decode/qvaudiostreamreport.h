@@ -18,7 +18,7 @@ class QV_API QvAudioStreamReport {
     int init(long long total, int channels, int samplerate, int bitsPerSample);
 
     // Enters the peak over all channels of the filled samples, at most one group, and moves on by them.
-    // QvStatus::failed behind the last group. Asserts values wider than three bytes.
+    // QvStatus::failed after the last group. Asserts values wider than three bytes.
     int processGroup(const QvPcm& pcm);
 
     // Highest peak of the groups in which the samples `from` to `to` lie, in dB below full scale (0 dB).

@@ -48,7 +48,7 @@ const char* prefixOf(int type) {
 struct StreamName {
     int type;
     int stream;
-    const char* rest;  // behind the number
+    const char* rest;  // after the number
 };
 
 bool startsLikeStream(const char* name) {

@@ -100,8 +100,8 @@ bool QvDecoderStateManager::_stateStored(const Any& file, AnyDict* out) {
 
 // --- Storing.
 
-// Under a name that leaves no room for the prefix the value would not be found again, and some names are none
-// of a file: such a value stays in the document.
+// Under a name that leaves no room for the prefix the value would not be found again, and some are no names
+// at all of a file: such a value stays in the document.
 bool QvDecoderStateManager::_shouldBeStoredAsBlob(const char* name, const Any& value) const {
     return value.isGeneric() && value.size() > largestInline && isPlainName(name) &&
            std::strlen(name) + blobPrefix.size() <= AnyDict::maxKeyLength;

@@ -10,7 +10,7 @@ class QvDecodePipe;
 // A decoder may stand in the list several times. The list owns its decoders only for deleteAll.
 class QV_API QvDPipeList : public TPtrList<QvDecodePipe> {
   public:
-    // First decoder behind `after` (null: from the start) whose "filename" equals `name`, or null. Asserts
+    // First decoder after `after` (null: from the start) whose "filename" equals `name`, or null. Asserts
     // that each decoder answers text and that `after` is in the list.
     QvDecodePipe* findByFilename(const Any& name, const QvDecodePipe* after = nullptr) const;
     // Closes and deletes each decoder once and clears the list.

@@ -4,7 +4,7 @@
 #include "core/arch/api.h"
 #include "core/value/any.h"
 
-// What is being opened; one object serves all calls for a file.
+// What is being opened; all calls for a file go to one object.
 struct QV_API QvFileOpenCbData {
     Any filename;     // the name, or the Vector of names, as the application gave it
     Any moduleName;   // the decoder being tried; invalid until the first one

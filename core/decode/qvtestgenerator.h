@@ -12,11 +12,11 @@
 // Video is BGR4. Reading goes on beyond "frames", with rising numbers: the reader counts. Sound is 16-bit
 // stereo at 44100 Hz, whatever is asked for, and ends. See builtin/decoders/testcard.h for the picture.
 //
-// The dictionary behind it, parameter "streams" of the module, has the Vectors "vids" and "auds" with a Dict
-// for each stream. A video stream's: "framerate" (Framerate, or Float frames a second), "picture" or "width"
-// and "height", "frameAspect" (Float, default from the size), "duration" (MediaTime, or Float seconds) or
-// "frames", "nrViews" (1 .. 10, default 1). An audio stream's: "duration" or "samples". The parameter "mode"
-// with "graybar" gives a still picture of gray bars in place of the card.
+// The dictionary that describes them, parameter "streams" of the module, has the Vectors "vids" and "auds"
+// with a Dict for each stream. A video stream's: "framerate" (Framerate, or Float frames a second), "picture"
+// or "width" and "height", "frameAspect" (Float, default from the size), "duration" (MediaTime, or Float
+// seconds) or "frames", "nrViews" (1 .. 10, default 1). An audio stream's: "duration" or "samples". The
+// parameter "mode" with "graybar" gives a still picture of gray bars in place of the card.
 #pragma once
 
 #include "core/arch/api.h"

@@ -1,5 +1,5 @@
 // Memory for many small objects of one life: a tree that is built, read and dropped. Each thread cuts pieces
-// from a block of its own, one behind the other; a piece may go back on any thread, and a block is freed with
+// from a block of its own, one after the other; a piece may go back on any thread, and a block is freed with
 // its last piece.
 #pragma once
 

@@ -37,7 +37,7 @@ struct XmlParser::Watch {
     }
     bool stopped() const { return refusal || failure; }
 
-    // Counts an element with its attributes. Those behind the specified ones come from declared defaults.
+    // Counts an element with its attributes. Those after the specified ones come from declared defaults.
     void countElement(const char** attrs) {
         const int specified = XML_GetSpecifiedAttributeCount(expat.get());
         int count = 0;

@@ -18,7 +18,7 @@ Any versionText(const Any& given, const AnyDict& dict) {
     return version.isTrue() ? version : Any("2.0");
 }
 
-// A broken contract that leaves a trace in the log, but is told by the result.
+// A broken contract: the result says so, and the log gets a line too.
 bool hasClass(const Any& className) {
     try {
         QV_ASSERT(className.isString());

@@ -66,7 +66,7 @@ class QV_API XmlTrans {
     void parseBitrate(const XmlNode* from, Any& to);    // invalid without a type
     void parsePair(const XmlNode* from, Any& to);       // a missing attribute counts as 0
     void parseMediaTime(const XmlNode* from, Any& to);  // invalid unless the scale is at least 1
-    // A dictionary under its class name; invalid if the element is none.
+    // A dictionary under its class name; invalid if the element holds no dictionary.
     void parseObject(const XmlNode* from, Any& to);
 
   protected:

@@ -38,7 +38,7 @@ void appendByte(std::string& text, unsigned char byte) {
 
 }  // namespace
 
-// A count stands for itself less one, as the byte behind it is a token of its own.
+// A count is written as one less, as the byte after it is a token of its own.
 long long qvGenericLength(std::string_view text) {
     long long length = 0;
     for (auto token = takeToken(text); !token.empty(); token = takeToken(text))

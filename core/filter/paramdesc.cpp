@@ -31,7 +31,7 @@ bool allOfType(const AnyVector& values, int type) {
     return true;
 }
 
-// The first fault behind a good name, or null.
+// The first fault after a good name, or null.
 const char* findFault(const AnyDict& desc) {
     if (!desc.get("type").isInt32()) return "missing 'type'";
     if (!desc.get("guiControl").isInt32()) return "missing 'guiControl'";

@@ -6,7 +6,7 @@
 // Parameters that every filter has:
 //   "_on"        int   1   the filter takes part; a chain builder skips a stored filter with 0
 //   "_position"  int   0   order among the filters of its side; the first of a side has 1
-//   "_front"     int   0   1: before the automatic converters, 0: behind them
+//   "_front"     int   0   1: before the automatic converters, 0: after them
 //   "info"       dict      read only: what store writes, without the three above
 #pragma once
 

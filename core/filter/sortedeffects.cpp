@@ -1,4 +1,4 @@
-// The order of effects in front of and behind the automatic filters.
+// The order of effects before and after the automatic filters.
 #include "core/engine/qvutil.h"
 
 namespace {

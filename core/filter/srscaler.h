@@ -29,7 +29,7 @@
 
 #include "core/arch/api.h"
 
-// Planes that need not lie one behind the other. The FOURCC "EXT1" stands for a pointer to this record; its
+// Planes that need not be adjacent in memory. The FOURCC "EXT1" stands for a pointer to this record; its
 // size and strides count then, and those of the call are not read.
 struct QvScalePicture {
     unsigned tag;     // qvFourcc("EXT1")
@@ -61,13 +61,13 @@ constexpr unsigned target601 = 1u << 28, target709 = 1u << 29;
 }  // namespace QvScale
 
 // Converts `source` into `target`. Both point to the first pixel of the top line, or to a QvScalePicture.
-// A stride of 0 asks the format's own; planes then, and with any other positive stride, lie one behind the
-// other, and chroma strides are the luma stride through the horizontal factor. Negative strides walk upwards;
-// with several planes they need a QvScalePicture. `rectangles`: source left, top, right, bottom in 1/256 of a
-// pixel, from centre to centre of the outermost pixels (right left of left mirrors), then target left, top,
-// right, bottom in pixels, the last ones included; null: the whole pictures. Target samples outside of the
-// rectangle stay. The target may be the source where both have lines of the same place and length and nothing
-// is scaled; they must not overlap otherwise.
+// A stride of 0 means the format's own; planes then, and with any other positive stride, follow one
+// another, and chroma strides are the luma stride through the horizontal factor. Negative strides walk
+// upwards; with several planes they need a QvScalePicture. `rectangles`: source left, top, right, bottom in
+// 1/256 of a pixel, from centre to centre of the outermost pixels (right left of left mirrors), then target
+// left, top, right, bottom in pixels, the last ones included; null: the whole pictures. Target samples
+// outside of the rectangle stay. The target may be the source where both have lines of the same place and
+// length and nothing is scaled; they must not overlap otherwise.
 //
 // 1, or 0 with the target untouched: an unknown FOURCC, a size or a rectangle without pixels, a rectangle
 // beyond the target, a null pointer, or a stride shorter than a line. Any thread may call at any time. The

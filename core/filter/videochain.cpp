@@ -113,7 +113,7 @@ void VideoChain::planDeinterlace() {
     interlaced_ = false;
 }
 
-// When scaling would throw half the lines away anyway, one field serves.
+// When scaling would throw half the lines away anyway, one field is enough.
 void VideoChain::dropField() {
     if (job_.outFramerate.interlaced() != 0 || !interlaced_ || deinterlace_ || backFactor_ > 1) return;
     if (job_.outHeight > height_ / 2) return;

@@ -37,7 +37,7 @@ class QV_API FiltersState : public AnyDict {
     void setFilterAt(int index, const AnyDict& dict);
     // Searches list() from after + 1; `after` lies between -1 and its size - 1. 0 also when nothing is found.
     int indexOf(const char* name, int after = -1) const;
-    // The first filter of that name, or with `previous` the one of that name behind it; null at the end.
+    // The first filter of that name, or with `previous` the next one of that name; null at the end.
     AnyDict* findFilter(const char* name, const AnyDict* previous = nullptr) const;
 
     // Removes every filter whose "_on" is not a nonzero Int32; "customFilters" itself stays.

@@ -36,7 +36,7 @@ class QV_API QvColor {
 // A packed colour is 0xRRGGBB, or 0xAARRGGBB where an alpha is read.
 //
 // Nothing clips, apart from fillGradient: what would leave the plane is an assertion, and so is a frame of
-// another format than stated. Lines, ellipses and gradients serve BGR4, BGRA and ARGB.
+// another format than stated. Lines, ellipses and gradients take BGR4, BGRA and ARGB.
 class QV_API QvDraw {
   public:
     static void getrgb(unsigned colour, unsigned char* r, unsigned char* g, unsigned char* b);

@@ -139,7 +139,7 @@ class QV_API QvFrame {
     // Draws src with its top left corner at x, y, which may be negative; what lies outside is left out, and
     // all coordinates are rounded to even. mask: GRAY of the source's size, 0 keeps the target, 255 takes the
     // source; null: the source covers. chromaMask: GRAY of half that size for the chroma of planar formats;
-    // without it every second sample of the mask serves. I422 and v210 are assertions.
+    // without it every second sample of the mask is used. I422 and v210 are assertions.
     // A row y at or beyond the target's width draws nothing, however tall the target is.
     int blend(int x, int y, const QvFrame& src, const QvFrame* mask = nullptr,
               const QvFrame* chromaMask = nullptr);

@@ -41,7 +41,7 @@ class QV_API QvPcm {
     int channels() const { return channels_; }
     int bytesPerSample() const { return bytesPerSample_; }  // of one channel's value
     int samplerate() const { return samplerate_; }
-    // Stream position of whoever fills the buffer: the sample behind the last one in it.
+    // Position in the stream, kept by whatever fills the buffer: the sample after the last one in it.
     long long position() const { return position_; }
     void setPosition(long long position) { position_ = position; }
     void copyMeta(const QvPcm& other);  // samplerate and position only

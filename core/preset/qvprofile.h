@@ -12,7 +12,7 @@ constexpr int raw = 0x216000F;
 constexpr int aviRaw = 0x2160010;
 }  // namespace QvProfile
 
-// The number behind a symbol such as "RAW"; -1 for an unknown one. Current symbols come first.
+// The number of a symbol such as "RAW"; -1 for an unknown one. Current symbols come first.
 QV_API int qvSymToProfile(const char* symbol);
 // The symbol of a number, "" if it has none.
 QV_API const char* qvProfileToSym(int profile);

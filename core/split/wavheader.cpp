@@ -15,7 +15,7 @@ constexpr unsigned extensibleFormat = 0xFFFE;
 constexpr std::array<unsigned char, 16> pcmSubtype = {0x01, 0x00, 0x00, 0x00, 0x00, 0x00, 0x10, 0x00,
                                                       0x80, 0x00, 0x00, 0xAA, 0x00, 0x38, 0x9B, 0x71};
 
-// Little-endian fields one behind the other.
+// Little-endian fields, one after the other.
 class Fields {
   public:
     explicit Fields(unsigned char* at) : at_(at) {}

@@ -1,4 +1,4 @@
-// QvBufStream: the object behind bufstream records, base of FIFOs, files and memory outputs.
+// QvBufStream: the object that owns a bufstream record, base of FIFOs, files and memory outputs.
 #pragma once
 
 #include <memory>
@@ -62,7 +62,7 @@ class QV_API QvBufStream {
     bool inited() const { return inited_; }
     bool enabled() const { return enabled_; }  // true at first; kept for the stream's user
     void setEnabled(bool on) { enabled_ = on; }
-    // Both codecs are borrowed: who made the stream, and who writes to it.
+    // Both codecs are borrowed: the maker of the stream, and its writer.
     QvCodec* owner() const { return owner_; }
     void setOwner(QvCodec* owner) { owner_ = owner; }
     QvCodec* atachee() const { return atachee_; }
@@ -90,8 +90,8 @@ class QV_API QvBufStream {
     int int32Param(const char* name, int fallback);
     const std::shared_ptr<QvIoFailure>& failure() const { return failure_; }
     const std::shared_ptr<QvCancel>& cancel() const { return cancel_; }
-    // Failures of `inner`, which stands behind this stream, count as this one's, and what ends the waits of
-    // this one ends those of `inner`.
+    // Failures of `inner`, to which this stream passes its data on, count as this one's, and what ends the
+    // waits of this one ends those of `inner`.
     void shareFailure(QvBufStream& inner) const {
         inner.failure_ = failure_;
         inner.cancel_ = cancel_;

@@ -72,7 +72,7 @@ class QV_API AnyVector {
     void resize(int count);       // new elements are invalid; a negative count is an assertion
     void swap(AnyVector& other);  // an assertion if `other` is the null sentinel
 
-    // The first index behind `after` whose element is ==, or -1. Pass a result to continue.
+    // The first index greater than `after` whose element is ==, or -1. Pass a result to continue.
     int indexOf(const Any& value, int after = -1) const;
     int find(const Any& value, int after = -1) const { return indexOf(value, after); }
     bool contains(const Any& value) const { return indexOf(value) >= 0; }
@@ -86,7 +86,7 @@ class QV_API AnyVector {
     Any join(const Any& separator) const;
     static AnyVector split(const Any& text, const Any& delimiter);
 
-    void sort(bool reverse = false);  // by Any's operator<; NaN goes behind all other Floats
+    void sort(bool reverse = false);  // by Any's operator<; NaN comes after all other Floats
     void sortDicts(const char* key);  // every element must be a Dict; a missing key reads as invalid
 
     // The value at a path as "2.name.0": indices and keys separated by dots; null if there is none.

@@ -204,7 +204,7 @@ void AnyDict::update(const AnyDict& other) {
 void AnyDict::swap(AnyDict& other) {
     QV_ASSERT(!other.isNull());
     if (isNull()) {
-        other.writable();  // so that the sentinel keeps one to be told by
+        other.writable();  // so that the sentinel keeps an entry by which it is recognised
         delete std::exchange(impl_, new Impl);
     }
     std::swap(impl_, other.impl_);

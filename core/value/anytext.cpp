@@ -37,7 +37,7 @@ class Replacer {
   public:
     Replacer(const std::vector<Unit>& find, const std::vector<Unit>& with)
         : find_(find), with_(with), grows_(with.size() > find.size()) {
-        // What lies behind the bound only moves further away.
+        // What lies after the bound only moves further away.
         if (grows_) with_.resize(std::min(with_.size(), longestReplaced + 2 * find_.size()));
     }
 

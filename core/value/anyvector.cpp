@@ -165,7 +165,7 @@ void AnyVector::resize(int count) {
 void AnyVector::swap(AnyVector& other) {
     QV_ASSERT(!other.isNull());
     if (isNull()) {
-        other.writable();  // so that the sentinel keeps one to be told by
+        other.writable();  // so that the sentinel keeps an element by which it is recognised
         delete std::exchange(impl_, new Impl);
     }
     std::swap(impl_, other.impl_);

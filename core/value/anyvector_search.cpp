@@ -13,7 +13,7 @@ namespace {
 
 bool isNumber(const Any& value) { return value.isInt() || value.isFloat(); }
 
-// Any's operator<, made a strict weak order: NaN goes behind all other Floats.
+// Any's operator<, made a strict weak order: NaN comes after all other Floats.
 bool before(const Any& a, const Any& b) {
     if (a.isFloat() && b.isFloat() && (std::isnan(a.asFloat()) || std::isnan(b.asFloat())))
         return !std::isnan(a.asFloat()) && std::isnan(b.asFloat());

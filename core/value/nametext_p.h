@@ -1,4 +1,4 @@
-// File names as plain text of either width, for the units behind qvfileutil.h.
+// File names as plain text of either width, for the units that implement qvfileutil.h.
 #pragma once
 
 #include <string>

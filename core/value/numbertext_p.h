@@ -12,7 +12,7 @@ namespace qvnumber {
 
 constexpr std::string_view blanks = " \t\n\v\f\r";
 
-// What a number starts with: behind leading blanks and one "+".
+// What a number starts with, after leading blanks and one "+".
 inline std::string_view begin(std::string_view text) {
     text.remove_prefix(std::min(text.find_first_not_of(blanks), text.size()));
     if (text.size() > 1 && text[0] == '+' && text[1] != '-') text.remove_prefix(1);

@@ -9,7 +9,7 @@
 
 class AnyVector;
 
-// The untyped list behind TPtrList and TRefList. Copies share the pointees.
+// The untyped list on which TPtrList and TRefList are built. Copies share the pointees.
 class QV_API PtrListImp {
   public:
     PtrListImp() = default;

@@ -16,7 +16,7 @@ namespace QvUtf {
 
 constexpr char32_t replacement = 0xFFFD;
 
-// Decodes the character at `position`, which must lie inside the text, and moves `position` behind it.
+// Decodes the character at `position`, which must lie inside the text, and moves `position` past it.
 QV_API char32_t next(std::string_view text, std::size_t& position);
 QV_API char32_t next(std::span<const unsigned short> text, std::size_t& position);
 

@@ -16,7 +16,8 @@ constexpr QvParamRow<FlipperSettings> rows[] = {
 };
 static_assert(qvParamTableOk<FlipperSettings>(rows));
 
-// Frames of one format may differ in their strides. With an odd height a plane of 4:2:0 ends behind its rows.
+// Frames of one format may differ in their strides. With an odd height a plane of 4:2:0 is longer than the
+// rows that are copied.
 void copyFlipped(QvFrame& to, const QvFrame& from, int plane) {
     const std::ptrdiff_t stride = from.stride(plane);
     const int rows = sampleRows(from, plane);

@@ -80,7 +80,7 @@ class Loader {
     // The file is checked and then loaded by its name, without links, right after. Loading what the check has
     // opened, as /proc/self/fd/N, would close the moment in between, but the library would no longer know its
     // own folder ($ORIGIN), nor the loader that it is loaded already. That moment is open only to this user
-    // and root, who could as well change the file before.
+    // and root, which could change the file beforehand as well.
     QvLibrary load(const std::string& name, int depth) {
         const QvFoundFile found = qvFindLibrary(name, trust_);
         if (found.name.empty()) return {nullptr, found.fault, found.reason};

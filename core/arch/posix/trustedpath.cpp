@@ -25,7 +25,7 @@ const Entry* lookUp(int (*ask)(Id, Entry*, char*, std::size_t, Entry**), Id id, 
 
 // True if members of the group are this user and root alone: root's group, and the group of the user's own
 // that most systems make with the user. It has the user's name; a system without names gives it the user's
-// number. That a group lists no other member says nothing: who has it as the primary group is not listed.
+// number. That a group lists no other member says nothing: users whose primary group it is are not listed.
 bool isPrivate(gid_t group) {
     std::vector<char> groupText, userText;
     struct group groupEntry {};
@@ -50,9 +50,9 @@ bool othersMayWrite(const struct stat& facts, const std::string& name) {
 
 std::string systemReason(int code) { return std::string("can't be opened: ") + std::strerror(code); }
 
-// Goes from the root through one part of the name after the other. It asks who may write before it looks into
-// a folder; so nobody else can exchange what comes after, and names will do where open folders were needed
-// otherwise.
+// Goes from the root through one part of the name after the other. It checks the permissions to write before
+// it looks into a folder; so nobody else can exchange what comes after, and names will do where open folders
+// were needed otherwise.
 class Walk {
   public:
     explicit Walk(QvLibraryTrust trust) : checks_(trust == QvLibraryTrust::owner) {}
@@ -91,7 +91,7 @@ class Walk {
         if (S_ISLNK(facts.st_mode))
             follow(name);
         else if (!rest_.empty())
-            folder_ = name;  // if it is none, the next part is not found
+            folder_ = name;  // if it is no folder, the next part is not found
         else
             end(name, facts);
     }

@@ -17,7 +17,7 @@ namespace {
 
 constexpr std::string_view signature = "Scenarist_SCC";
 constexpr std::string_view mark = "\xEF\xBB\xBF";
-constexpr std::size_t longestLine = 8192;  // what is behind it counts as a line of its own
+constexpr std::size_t longestLine = 8192;  // the rest counts as a line of its own
 constexpr std::size_t blockSize = 64 * 1024;
 constexpr std::size_t wordDigits = 4;
 constexpr std::size_t longestShown = 20;  // of a damaged word

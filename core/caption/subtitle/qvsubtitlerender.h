@@ -27,7 +27,7 @@ class QvSubtitle;
 class QvSubtitles;
 class QvTextRenderingOptions;
 
-// One thread at a time; what has been drawn is kept, so that text that stays costs no more than its blending.
+// One thread at a time; drawn text is kept, so that each further frame with it costs only the blending.
 class QV_API QvSubtitleRender {
   public:
     QvSubtitleRender();

@@ -92,7 +92,7 @@ class QV_API QvSubtitles {
     const char* encodingName() const;
     int maxRows() const { return maxRows_; }  // of all entries; 0 without any
 
-    // Bytes of text, as UTF-8, behind the place where parseFile stopped: in an SRT file at a number that no
+    // Bytes of text, as UTF-8, after the place where parseFile stopped: in an SRT file at a number that no
     // times follow, in UTF-16 and UTF-32 where the text becomes longer than the file. 0: all was read.
     long long unread() const { return unread_; }
 

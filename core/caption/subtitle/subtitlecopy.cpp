@@ -17,7 +17,7 @@ constexpr const char* unicodeNames[] = {"UTF-8", "UTF-16BE", "UTF-16LE", "UTF-32
 
 struct Decoded {
     std::string text;       // UTF-8
-    long long badLine = 0;  // the first with bytes that are none of the encoding; 0 without one
+    long long badLine = 0;  // the first with bytes that the encoding does not have; 0 without one
 };
 
 // Until the first character that stands for bad bytes.

@@ -8,7 +8,7 @@
 
 class Any;
 
-// A file's bytes with four zeros behind them.
+// A file's bytes, followed by four zeros.
 class SubtitleBytes {
   public:
     // 0, or -1 (no memory is told in the debug log).
@@ -29,7 +29,7 @@ struct SubtitleMark {
 };
 SubtitleMark findMark(std::string_view bytes);
 
-// The text behind the mark as UTF-8 (or as it stands, in an encoding that the file does not tell), with line
+// The text after the mark as UTF-8 (or as it stands, in an encoding that the file does not tell), with line
 // feeds where the file uses carriage returns alone. A unit of several bytes is taken in this machine's order,
 // or with its bytes `swapped`.
 std::string subtitleText(std::string_view bytes, const SubtitleMark& mark, bool swapped);

@@ -88,7 +88,7 @@ std::vector<std::size_t> filled(const std::vector<Piece>& pieces, long long wide
     return starts;
 }
 
-// The smallest width that needs no more lines.
+// The smallest width at which the number of lines stays the same.
 std::vector<std::size_t> balanced(const std::vector<Piece>& pieces, long long widest) {
     auto starts = filled(pieces, widest);
     long long low = 0, high = widest;  // high is enough, low is not

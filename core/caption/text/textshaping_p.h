@@ -15,6 +15,6 @@ struct Paragraph {
 Paragraph paragraphOf(std::span<const StyledCharacter> text);
 
 // Appends the glyphs of a part of a line in the order in which they stand from left to right, from `pen` on
-// (1/64 pixels). Returns the pen behind the last one.
+// (1/64 pixels). Returns the pen after the last one.
 long long shape(std::span<const StyledCharacter> text, const Paragraph& paragraph, long long pen,
                 std::vector<PlacedGlyph>& glyphs);

@@ -19,7 +19,7 @@ constexpr int targetFailed = -8;
 
 // Recursive, since a logger may log.
 std::recursive_mutex& section() {
-    static auto& lock = *new std::recursive_mutex;  // never destroyed: the log serves to the very end
+    static auto& lock = *new std::recursive_mutex;  // never destroyed: the log is used until the very end
     return lock;
 }
 using Lock = std::lock_guard<std::recursive_mutex>;

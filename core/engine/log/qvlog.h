@@ -40,7 +40,8 @@ class QV_API QvDbgLog {
     // Opens the target and stores the logger (borrowed, may be null). The target is the environment variable
     // QVTARSEL_DEBUG unless that is empty or begins with "0", else `logfile`: "stdout", "stderr", "dbgout"
     // (debugger output) or the name of a file, which is overwritten; null or invalid: no target. The present
-    // target, given again, is left alone. 0, or -8 if the file can't be opened: the standard error serves.
+    // target, given again, is left alone. 0, or -8 if the file can't be opened: the standard error is used
+    // then.
     int init(const Any* logfile, QvLogBase* logger);
     int setLogfile(Any* logfile) { return init(logfile, logger()); }
     // Null only stops the calls: when it returns, none is running on another thread.

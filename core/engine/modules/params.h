@@ -1,6 +1,6 @@
 // Parameters of a codec as rows over its typed fields.
 //
-// A codec keeps typed members and one constexpr table; the table serves setParam, getParam, store,
+// A codec keeps typed members and one constexpr table; the table is used by setParam, getParam, store,
 // restore and the parameter descriptions. An Any is checked and converted once, here at the door.
 //
 //     struct Settings { double start = 0; int frames = 25; bool invert = false; };
@@ -199,7 +199,7 @@ bool qvTakesValue(const QvParamRow<T>& row) {
     return !(row.flags & qvParamReadOnly) && (!access || access->set || (row.flags & qvParamIgnored));
 }
 
-// Sets the member behind a row. nullopt: no row takes this name, so the caller asks its base.
+// Sets the member of a row. nullopt: no row takes this name, so the caller asks its base.
 // QvStatus::invalidParam: the value has a wrong type or lies outside the range; the member is unchanged.
 template <class T>
 std::optional<int> qvSetParamRow(std::span<const QvParamRow<T>> rows, T& object, const char* name,
@@ -221,7 +221,7 @@ std::optional<int> qvSetParamRow(std::span<const QvParamRow<T>> rows, T& object,
         row->member);
 }
 
-// Writes the value behind a row and returns true; false if no row answers to this name.
+// Writes the value of a row and returns true; false if no row answers to this name.
 template <class T>
 bool qvGetParamRow(std::span<const QvParamRow<T>> rows, const T& object, const char* name, Any& value) {
     const auto* row = qvFindParamRow(rows, name);

@@ -136,7 +136,7 @@ int QvCodec::storeError(int code, const char* format, va_list args) {
     try {
         errorText_ = QvFormattedText<maxErrorText>(format, args).text();
     } catch (const std::bad_alloc&) {
-        errorText_.invalidate();  // a failure is never told by throwing
+        errorText_.invalidate();  // a failure is returned, never thrown
     }
     if (code != QvStatus::ok) qv_dbg()->error("[%s] %s (%d)", displayName(), errorDesc(), code);
     return code;

@@ -22,7 +22,7 @@ struct QvExternalIO {
     void* words[9] = {};
 };
 
-// One object serves the process: qv_registry(). Set-up and shut-down (configuration, loading, cleanup, module
+// The process has one: qv_registry(). Set-up and shut-down (configuration, loading, cleanup, module
 // attributes) belong to the application's thread while nothing is processed. In between, lookups and newCodec
 // may run on any thread; there is no lock.
 class QV_API QvRegistry {

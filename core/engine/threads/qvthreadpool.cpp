@@ -15,7 +15,7 @@ constexpr int turnsBeforeSleep = 200;
 
 }  // namespace
 
-// One parallelFor. It lives on the stack of its caller, who waits for every helper before it goes.
+// One parallelFor. It lives on the stack of its caller, which waits for every helper before it returns.
 struct QvThreadPool::Job {
     Job(Call function, void* data, int parts) : call(function), context(data), count(parts) {}
 

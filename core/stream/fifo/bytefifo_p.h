@@ -1,4 +1,4 @@
-// The ring of bytes behind FIFOs and memory outputs.
+// The ring of bytes of FIFOs and memory outputs.
 //
 //     0 ........ start .................................. end
 //     | headroom | ring proper                            |

@@ -1,4 +1,4 @@
-// The object behind a FIFO: one block that starts with the records of both sides.
+// The object of a FIFO: one block that starts with the records of both sides.
 #pragma once
 
 #include <cstddef>

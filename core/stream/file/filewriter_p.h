@@ -12,7 +12,7 @@
 #include "core/stream/stdfile_p.h"
 
 // Blocks of request() are gathered in the buffer, a confirmed block is never split; copybytes() goes straight
-// to the file behind what is buffered. After a failed write nothing more is written, so that a file has no
+// to the file after what is buffered. After a failed write nothing more is written, so that a file has no
 // gap: every further block is refused.
 class FileWriter {
   public:

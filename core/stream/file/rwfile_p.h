@@ -1,4 +1,4 @@
-// The record of a file that is written and can be read again: one buffer that serves the direction in force.
+// The record of a file that is written and can be read again: one buffer, used for the current direction.
 #pragma once
 
 #include <memory>

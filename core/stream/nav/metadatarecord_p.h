@@ -1,4 +1,4 @@
-// The record behind QvMetadataFile: eight slots with a file each.
+// The record of QvMetadataFile: eight slots with a file each.
 #pragma once
 
 #include "core/arch/widename.h"

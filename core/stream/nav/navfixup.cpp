@@ -32,7 +32,7 @@ constexpr uint32_t hasVideo = 0x80000000;
 constexpr uint32_t videoBetween = 0x40000000;
 constexpr uint32_t noVobu = 0x3FFFFFFF;
 constexpr uint32_t noVideo = 0xBFFFFFFF;
-constexpr uint32_t videoOnTheWay = 0x7FFFFFFF;  // no VOBU that far, but video behind the next nearer entry
+constexpr uint32_t videoOnTheWay = 0x7FFFFFFF;  // no VOBU that far, but video after the next nearer entry
 constexpr uint32_t noSubpic = 0x7FFFFFFF;
 
 // Times of the search table in 90 kHz: each half second to 7.5 s, then 10, 30, 60 and 120 s. The last four
@@ -77,7 +77,7 @@ class Vobus {
 
     int count() const { return static_cast<int>(data_.sector.size()); }
     bool video(int i) const { return data_.flags[static_cast<size_t>(i)] & 1; }
-    // 0 behind the last, as in an array that was cleared.
+    // 0 after the last, as in an array that was cleared.
     uint32_t sector(int i) const { return i < count() ? data_.sector[static_cast<size_t>(i)] : 0; }
     bool videoIn(int first, int behind) const {
         return first < behind && video_[static_cast<size_t>(first)] < video_[static_cast<size_t>(behind)];
