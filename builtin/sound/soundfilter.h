@@ -1,0 +1,72 @@
+// What the sound filters share: one output buffer, to which each write adds and from whose head the reader
+// takes, and parameters that are rows over typed settings.
+//
+// Between the first and the last stage of a chain a sample is a 32-bit integer in the range of 24 bits: full
+// scale is 2^23, and the eight bits above it are headroom.
+#pragma once
+
+#include <span>
+
+#include "core/engine/modules/params.h"
+#include "core/filter/qvfilter.h"
+#include "core/media/qvpcm.h"
+
+// Lifecycle and hand-over. A filter goes created (1), init (2), open (3), close (2).
+class SoundFilter : public QvAudioFilter {
+  public:
+    int open() override;
+    int close() override;  // the output goes with its memory
+    int samples() const override { return output_.samples(); }
+    QvPcm* pcm() override { return &output_; }
+    int erase(int n) override { return output_.erase(n); }
+
+    using QvAudioFilter::getParam;
+
+  protected:
+    // `tag`: static text before the filter's line about missing memory, such as "adelay::writepcm".
+    explicit SoundFilter(const char* tag) : tag_(tag) {}
+
+    bool opened() const;
+    // The assertions "Not inited" and "Not opened".
+    void requireInited() const;
+    void requireOpened() const;
+    // Adds `count` samples, whose contents are the caller's to fill, after those that wait in the output. The
+    // first call after open gives the output its format. The place of the first one goes to `room`. 0, or -3
+    // with a text; the output keeps what it had then.
+    int makeRoom(const QvPcmFormat& format, int count, unsigned char*& room);
+
+    QvPcm output_;
+
+  private:
+    const char* tag_;
+};
+
+// The same with parameters: `rows` is the constexpr table of the settings. What is stored is each filter's
+// own.
+template <class Settings>
+class SoundFilterOf : public SoundFilter {
+  public:
+    using Rows = std::span<const QvParamRow<Settings>>;
+
+    int init() override {
+        settings_ = {};
+        return SoundFilter::init();
+    }
+    // Asserts "Not inited" for a parameter of a row.
+    int setParam(const char* name, const Any& value) override {
+        if (getState() == stateCreated && qvFindParamRow<Settings>(rows_, name)) requireInited();
+        if (const auto result = _setRow<Settings>(rows_, settings_, name, value)) return *result;
+        return SoundFilter::setParam(name, value);
+    }
+    void getParam(const char* name, Any& value) const override {
+        if (!qvGetParamRow<Settings>(rows_, settings_, name, value)) SoundFilter::getParam(name, value);
+    }
+
+    using SoundFilter::getParam;
+
+  protected:
+    SoundFilterOf(const char* tag, Rows rows) : SoundFilter(tag), rows_(rows) {}
+
+    Settings settings_;
+    const Rows rows_;
+};
