@@ -45,8 +45,13 @@ std::string textOf(const Any& name) {
 }
 
 constexpr QvParamRow<Settings> rows[] = {
-    {"framerate", QvParamAccess<Settings>{setFramerate, getFramerate}, qvParamStored},
-    {"readRate", QvParamAccess<Settings>{setReadRate, getReadRate}},
+    {.name = "framerate",
+     .member = QvParamAccess<Settings>{setFramerate, getFramerate},
+     .flags = qvParamStored,
+     .help = "of the frame numbers in a .sub file"},
+    {.name = "readRate",
+     .member = QvParamAccess<Settings>{setReadRate, getReadRate},
+     .help = "at which the subtitles are read"},
 };
 static_assert(qvParamTableOk<Settings>(rows));
 

@@ -7,9 +7,22 @@
 
 #include "builtin/creators.h"
 #include "core/arch/qvassert.h"
+#include "core/engine/modules/params.h"
 #include "core/engine/status.h"
 
 namespace {
+
+constexpr QvParamRow<GeneratorPipe> rows[] = {
+    {.name = "streams",
+     .flags = qvParamByHand | qvParamWriteOnly,
+     .help = "lists vids and auds with a dictionary for each stream, see qvtestgenerator.h",
+     .type = Any::Dict},
+    {.name = "mode",
+     .flags = qvParamByHand | qvParamWriteOnly,
+     .help = "graybar: a still picture of gray bars",
+     .type = Any::String},
+};
+static_assert(qvParamTableOk<GeneratorPipe>(rows));
 
 bool is(const char* name, const char* other) { return std::strcmp(name, other) == 0; }
 
@@ -52,7 +65,7 @@ void GeneratorPipe::getParam(const char* name, Any& value) const {
         value = AnyDict("streams", Any(streams_));
     else if (is(name, "isMeta"))
         value = 1;
-    else
+    else if (!qvGetParamRow<GeneratorPipe>(rows, *this, name, value))
         QvDecodePipe::getParam(name, value);
 }
 

@@ -14,8 +14,9 @@ struct RawAviMuxParams {
     static std::span<const QvParamRow<Mux>> rows() {
         using M = const Mux&;
         static const QvParamRow<Mux> table[] = {
-            {"riffBytes", &Mux::riffBytes_, qvParamStored, 1024, 1 << 30},
-            {"segments", &Mux::segments_, qvParamStored, 1, 65536},
+            {"riffBytes", &Mux::riffBytes_, qvParamStored, 1024, 1 << 30, "", "bytes",
+             "of each RIFF part of the file"},
+            {"segments", &Mux::segments_, qvParamStored, 1, 65536, "", "", "RIFF parts at most"},
             {"framerate", {}, qvParamIgnored},
             {"estimateSecKb", Access{nullptr, [](M m, Any& v) { v = qvEstimateSecKb(m); }}},
             {"videoCodecs", Access{nullptr, [](M m, Any& v) { v = qvMuxerCodecs(m, 7); }}},

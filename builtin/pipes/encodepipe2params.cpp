@@ -40,6 +40,29 @@ std::optional<Address> parseAddress(const char* name) {
     return std::nullopt;
 }
 
+constexpr QvParamRow<EncodePipe2> described[] = {
+    {.name = "filename",
+     .flags = qvParamByHand,
+     .help = "the output; the multiplexer may make several names of it",
+     .type = Any::String},
+    {.name = "sinkName", .flags = qvParamByHand, .help = "module of the sink", .type = Any::String},
+    {.name = "twoPass", .flags = qvParamByHand, .help = "for the video encoders", .type = Any::Int32},
+    {.name = "pal",
+     .flags = qvParamByHand,
+     .help = "for the video encoders and the multiplexer",
+     .type = Any::Int32},
+    {.name = "adjustCodecToMuxer",
+     .flags = qvParamByHand | qvParamWriteOnly,
+     .help = "1: encoders follow what the multiplexer demands",
+     .type = Any::Int32},
+    {.name = "video0/...",
+     .flags = qvParamByHand,
+     .help = "a parameter of a member: video0, audio1, muxer or sink, a slash and its name"},
+    {.name = "extension", .flags = qvParamByHand | qvParamReadOnly, .type = Any::String},
+    {.name = "filesWritten", .flags = qvParamByHand | qvParamReadOnly, .type = Any::Vector},
+};
+static_assert(qvParamTableOk<EncodePipe2>(described));
+
 }  // namespace
 
 struct EncodePipeParams {
@@ -292,5 +315,5 @@ void EncodePipe2::getParam(const char* name, Any& value) const {
             target->getParam(address->rest, value);
         return;
     }
-    QvEncodePipe::getParam(name, value);
+    if (!qvGetParamRow<EncodePipe2>(described, *this, name, value)) QvEncodePipe::getParam(name, value);
 }

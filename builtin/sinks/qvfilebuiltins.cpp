@@ -16,8 +16,8 @@ struct FileSinkParams {
 
     static std::span<const QvParamRow<FileSink>> rows() {
         static const QvParamRow<FileSink> table[] = {
-            {"filename", &FileSink::filename_},
-            {"bufsize", &FileSink::bufsize_, qvParamPlain, 1, largestBuffer},
+            {.name = "filename", .member = &FileSink::filename_, .help = "the output", .type = Any::String},
+            {"bufsize", &FileSink::bufsize_, qvParamPlain, 1, largestBuffer, "", "bytes"},
             {"filesWritten", QvParamAccess<FileSink>{nullptr, filesWritten}},
         };
         return table;

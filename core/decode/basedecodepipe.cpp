@@ -4,8 +4,17 @@
 #include <utility>
 
 #include "core/arch/qvassert.h"
+#include "core/engine/modules/params.h"
 #include "core/engine/status.h"
 #include "core/media/qvbuffer.h"
+
+namespace {
+
+constexpr QvParamRow<BaseDecodePipe> rows[] = {
+    {.name = "filename", .flags = qvParamByHand, .help = "the file", .type = Any::String},
+};
+
+}  // namespace
 
 DPipeStream::~DPipeStream() = default;
 
@@ -39,7 +48,7 @@ int BaseDecodePipe::setParam(const char* name, const Any& value) {
 void BaseDecodePipe::getParam(const char* name, Any& value) const {
     if (std::strcmp(name, "filename") == 0)
         value = filename_;
-    else
+    else if (!qvGetParamRow<BaseDecodePipe>(rows, *this, name, value))
         QvDecodePipe::getParam(name, value);
 }
 

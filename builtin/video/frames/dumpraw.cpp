@@ -10,7 +10,10 @@
 namespace {
 
 constexpr QvParamRow<DumpRawSettings> rows[] = {
-    {.name = "filename", .member = &DumpRawSettings::filename, .flags = qvParamStored},
+    {.name = "filename",
+     .member = &DumpRawSettings::filename,
+     .flags = qvParamStored,
+     .help = "file that the planes of each frame are written to"},
 };
 static_assert(qvParamTableOk<DumpRawSettings>(rows));
 

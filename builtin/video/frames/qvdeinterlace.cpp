@@ -40,7 +40,10 @@ void getMethod(const DeinterlaceSettings& settings, Any& value) {
 }
 
 constexpr QvParamRow<DeinterlaceSettings> rows[] = {
-    {"deinterlace", QvParamAccess<DeinterlaceSettings>{setMethod, getMethod}, qvParamStored},
+    {.name = "deinterlace",
+     .member = QvParamAccess<DeinterlaceSettings>{setMethod, getMethod},
+     .flags = qvParamStored,
+     .help = "top or bottom: that field; bob: the mean of both; reverse: exchanges them; else unchanged"},
 };
 static_assert(qvParamTableOk<DeinterlaceSettings>(rows));
 

@@ -41,11 +41,15 @@ void getFps(const Settings& settings, Any& value) {
 
 constexpr QvParamRow<Settings> rows[] = {
     {"inFramerate", Access{setRate<&Settings::inRate, &Settings::inFps>, getFps<&Settings::inFps>},
-     qvParamStored},
+     qvParamStored, 0.1, 120, "", "frames/s", "of the frames that come in; also a frame rate with its scan"},
     {"outFramerate", Access{setRate<&Settings::outRate, &Settings::outFps>, getFps<&Settings::outFps>},
-     qvParamStored},
-    {"interlace", &Settings::interlace, qvParamStored, 0, 2},
-    {"pulldown", &Settings::pulldown, qvParamStored},
+     qvParamStored, 0.1, 120, "", "frames/s", "of the frames that go out; also a frame rate with its scan"},
+    {"interlace", &Settings::interlace, qvParamStored, 0, 2, "", "",
+     "1 or 2: weaves two frames into one, top or bottom field first, at half the rate"},
+    {.name = "pulldown",
+     .member = &Settings::pulldown,
+     .flags = qvParamStored,
+     .help = "3:2 pulldown, at 5/4 of the rate"},
 };
 static_assert(qvParamTableOk<Settings>(rows));
 

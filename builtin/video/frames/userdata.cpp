@@ -25,8 +25,16 @@ template <void* Settings::*member>
 constexpr QvParamAccess<Settings> pointerTo{setPointer<member>, getPointer<member>};
 
 constexpr QvParamRow<Settings> rows[] = {
-    {.name = "context", .member = pointerTo<&Settings::context>, .flags = qvParamStored},
-    {.name = "callback", .member = pointerTo<&Settings::callback>, .flags = qvParamStored},
+    {.name = "context",
+     .member = pointerTo<&Settings::context>,
+     .flags = qvParamStored,
+     .help = "passed to the callback",
+     .type = Any::Generic},
+    {.name = "callback",
+     .member = pointerTo<&Settings::callback>,
+     .flags = qvParamStored,
+     .help = "a QvUserDataCallback, called with each frame",
+     .type = Any::Generic},
 };
 static_assert(qvParamTableOk<Settings>(rows));
 

@@ -12,7 +12,8 @@ constexpr QvParamRow<FlipperSettings> rows[] = {
     {.name = "flip",
      .member = &FlipperSettings::flip,
      .flags = qvParamStored,
-     .description = "Flip vertically"},
+     .description = "Flip vertically",
+     .help = "turns frames upside down, and reverses the field order"},
 };
 static_assert(qvParamTableOk<FlipperSettings>(rows));
 

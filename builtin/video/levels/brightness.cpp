@@ -13,9 +13,10 @@ namespace {
 using Settings = BrightnessSettings;
 
 constexpr QvParamRow<Settings> rows[] = {
-    {"brightness", &Settings::brightness, qvParamStored, -1, 1, "Brightness"},
-    {"contrast", &Settings::contrast, qvParamStored, 0, 10, "Contrast"},
-    {"gamma", &Settings::gamma, qvParamStored, 0.1, 10, "Gamma"},
+    {"brightness", &Settings::brightness, qvParamStored, -1, 1, "Brightness", "",
+     "added to the level; 1 is the distance from black to white"},
+    {"contrast", &Settings::contrast, qvParamStored, 0, 10, "Contrast", "", "spreads levels about mid-grey"},
+    {"gamma", &Settings::gamma, qvParamStored, 0.1, 10, "Gamma", "", "above 1 lightens the middle"},
 };
 static_assert(qvParamTableOk<Settings>(rows));
 

@@ -15,9 +15,9 @@ using Settings = VideoFadeSettings;
 constexpr uint32_t whole = 65536;
 
 constexpr QvParamRow<Settings> rows[] = {
-    {"fade_in", &Settings::in, qvParamStored, 0, INT_MAX, "Frames count to fade in"},
-    {"fade_out", &Settings::out, qvParamStored, 0, INT_MAX, "Frames count to fade out"},
-    {"frames_count", &Settings::count, qvParamStored, 0, INT_MAX, "Total frames count in segment"},
+    {"fade_in", &Settings::in, qvParamStored, 0, INT_MAX, "Frames count to fade in", "frames"},
+    {"fade_out", &Settings::out, qvParamStored, 0, INT_MAX, "Frames count to fade out", "frames"},
+    {"frames_count", &Settings::count, qvParamStored, 0, INT_MAX, "Total frames count in segment", "frames"},
 };
 static_assert(qvParamTableOk<Settings>(rows));
 

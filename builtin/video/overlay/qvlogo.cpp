@@ -19,9 +19,10 @@ constexpr QvParamRow<Settings> rows[] = {
      .member = &Settings::filename,
      .flags = qvParamStored,
      .description = "Logo picture (PNG)"},
-    {"xpos", &Settings::x, qvParamStored, -mostOffset, mostOffset, "x offset (negative for right alignment)"},
-    {"ypos", &Settings::y, qvParamStored, -mostOffset, mostOffset,
-     "y offset (negative for bottom alignment)"},
+    {"xpos", &Settings::x, qvParamStored, -mostOffset, mostOffset, "x offset (negative for right alignment)",
+     "pixels"},
+    {"ypos", &Settings::y, qvParamStored, -mostOffset, mostOffset, "y offset (negative for bottom alignment)",
+     "pixels"},
     {"alpha", &Settings::alpha, qvParamStored, 0, 1, "Logo opacity"},
 };
 static_assert(qvParamTableOk<Settings>(rows));

@@ -71,6 +71,7 @@ struct Range {
 Range rangeOf(Kind kind, double min, double max) {
     switch (kind) {
         case Kind::integer:
+        case Kind::special:
         case Kind::number: return {min, max};
         case Kind::natural: return {std::max(min, 0.0), std::min(max, upperBound<unsigned> - 1)};
         case Kind::flag: return {0, 1};
@@ -197,4 +198,23 @@ void describe(Kind kind, double min, double max, const Any& value, AnyDict& row)
     if (range.hasMax()) row.set("max", range.max);
 }
 
+void collect(const AnyVector& rows, Any& value) {
+    AnyVector all = value.isVector() ? value.asVector() : AnyVector();
+    for (const Any& row : rows) all.append(row);
+    value = all;
+}
+
 }  // namespace qvparam
+
+AnyVector qvParameters(const QvCodec& codec) {
+    const Any all = codec.getParam(qvParamRowsName);
+    AnyVector once;
+    if (!all.isVector()) return once;
+    const auto isThere = [&](const Any& name) {
+        return std::any_of(once.begin(), once.end(),
+                           [&](const Any& row) { return row.asDict().get("name") == name; });
+    };
+    for (const Any& row : all.asVector())
+        if (!isThere(row.asDict().get("name"))) once.append(row);
+    return once;
+}

@@ -50,7 +50,13 @@ enum QvParamFlag : unsigned {
     qvParamReadOnly = 2,   // getParam answers; setParam treats the name as unknown
     qvParamIgnored = 4,    // setParam accepts it with 0 and no effect; getParam does not know it
     qvParamWriteOnly = 8,  // setParam takes it; getParam does not know it
+    qvParamByHand = 16,    // the codec itself takes or answers the name; the row only describes it
+    qvParamNeeded = 32,  // without it the codec works with a value that nobody can mean, as a size of a file
 };
+
+// getParam of this name answers with the descriptions of all rows that a codec and its bases have, see
+// qvParameters. Each table adds its own while the name passes from a class to its base.
+inline constexpr const char* qvParamRowsName = "_parameters";
 
 // For what is not a plain member: `set` returns a status (null: read-only), `get` writes its Any (null:
 // write-only).
@@ -72,7 +78,10 @@ struct QvParamRow {
     // Inclusive range of a numeric row. A value outside is refused with QvStatus::invalidParam.
     double min = std::numeric_limits<double>::lowest();
     double max = std::numeric_limits<double>::max();
-    const char* description = "";
+    const char* description = "";  // for a user interface
+    const char* unit = "";
+    const char* help = "";    // for a manual, where the description is not enough
+    int type = Any::Invalid;  // Any::Type of a value without a plain member, if it is not that of its default
 };
 
 namespace qvparam {
@@ -175,6 +184,9 @@ QV_API std::string refusal(const char* name, Kind kind, double min, double max, 
 // Adds "type", "min" and "max" as far as the kind has them; a "special" row has the type of its value.
 QV_API void describe(Kind kind, double min, double max, const Any& value, AnyDict& row);
 
+// Appends the Dicts of `rows` to `value`, an invalid value or a Vector.
+QV_API void collect(const AnyVector& rows, Any& value);
+
 template <class T, class V>
 int assign(T& object, V T::*member, const QvParamRow<T>& row, const Any& value) {
     V converted{};
@@ -192,9 +204,13 @@ const QvParamRow<T>* qvFindParamRow(std::span<const QvParamRow<T>> rows, const c
     return nullptr;
 }
 
+template <class T>
+AnyVector qvDescribeParamRows(std::span<const QvParamRow<T>> rows, const T& defaults);
+
 // False for a name that only getParam answers.
 template <class T>
 bool qvTakesValue(const QvParamRow<T>& row) {
+    if (row.flags & qvParamByHand) return false;
     const auto* access = std::get_if<QvParamAccess<T>>(&row.member);
     return !(row.flags & qvParamReadOnly) && (!access || access->set || (row.flags & qvParamIgnored));
 }
@@ -221,11 +237,14 @@ std::optional<int> qvSetParamRow(std::span<const QvParamRow<T>> rows, T& object,
         row->member);
 }
 
-// Writes the value of a row and returns true; false if no row answers to this name.
+// Writes the value of a row and returns true; false if no row answers to this name, so that the caller
+// asks its base.
 template <class T>
 bool qvGetParamRow(std::span<const QvParamRow<T>> rows, const T& object, const char* name, Any& value) {
     const auto* row = qvFindParamRow(rows, name);
-    if (!row || (row->flags & (qvParamIgnored | qvParamWriteOnly))) return false;
+    if (!row && name && std::strcmp(name, qvParamRowsName) == 0)
+        qvparam::collect(qvDescribeParamRows(rows, object), value);
+    if (!row || (row->flags & (qvParamIgnored | qvParamWriteOnly | qvParamByHand))) return false;
     return std::visit(
         [&](auto member) {
             using M = decltype(member);
@@ -291,8 +310,8 @@ std::string qvParamRefusal(std::span<const QvParamRow<T>> rows, const char* name
 }
 
 // One Dict for each row that takes or gives a value: "name", "type" (as Any::typeName), "min" and "max"
-// (Float, where there is a range), "default" (what `defaults` holds), "description" (if the row has one),
-// "readOnly" or "writeOnly" (1).
+// (Float, where there is a range), "default" (what `defaults` holds), "description", "unit" and "help" (if
+// the row has one), "readOnly", "writeOnly" or "needed" (1).
 template <class T>
 AnyVector qvDescribeParamRows(std::span<const QvParamRow<T>> rows, const T& defaults) {
     AnyVector all;
@@ -302,13 +321,24 @@ AnyVector qvDescribeParamRows(std::span<const QvParamRow<T>> rows, const T& defa
         Any value;
         if (qvGetParamRow(rows, defaults, row.name, value)) described.set("default", value);
         qvparam::describe(qvparam::kindOfRow(row), row.min, row.max, value, described);
+        if (row.type != Any::Invalid) described.set("type", Any::typeName(row.type));
         if (*row.description) described.set("description", row.description);
-        if (!qvTakesValue(row)) described.set("readOnly", 1);
+        if (*row.unit) described.set("unit", row.unit);
+        if (*row.help) described.set("help", row.help);
+        const bool settable = row.flags & qvParamByHand ? !(row.flags & qvParamReadOnly) : qvTakesValue(row);
+        if (!settable) described.set("readOnly", 1);
         if (row.flags & qvParamWriteOnly) described.set("writeOnly", 1);
+        if (row.flags & qvParamNeeded) described.set("needed", 1);
         all.append(described);
     }
     return all;
 }
+
+// The parameters of a codec, as its tables describe them: a Dict for each, as of qvDescribeParamRows.
+// "default" is the present value, that of a new codec being its default. A name that a class and its base
+// both have is there once, as the class has it. Names that framework and codecs use among themselves begin
+// with '_'.
+QV_API AnyVector qvParameters(const QvCodec& codec);
 
 template <class T>
 std::optional<int> QvCodec::_setRow(std::span<const QvParamRow<T>> rows, T& object, const char* name,

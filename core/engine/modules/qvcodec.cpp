@@ -1,11 +1,13 @@
 #include "core/engine/modules/qvcodec.h"
 
+#include <cstring>
 #include <new>
 
 #include "core/arch/formattext_p.h"
 #include "core/arch/qvassert.h"
 #include "core/arch/qvexception.h"
 #include "core/engine/log/qvlog.h"
+#include "core/engine/modules/params.h"
 #include "core/engine/modules/qvmodule.h"
 #include "core/engine/modules/qvregistry.h"
 #include "core/engine/qvutil.h"
@@ -25,6 +27,8 @@ bool tracesParams() {
     const QvRegistry* registry = qv_registry();
     return registry && registry->getDbgOption("log_setparam").isTrue();
 }
+
+bool isParamRows(const char* name) { return name && std::strcmp(name, qvParamRowsName) == 0; }
 
 }  // namespace
 
@@ -68,7 +72,7 @@ void QvCodec::getParam(const char* name, Any& value) const {
     if (Any(name ? name : "") == "displayName") {
         value = displayName();
         qv_dbg()->warning("QvCodec::displayName should be used instead of getParam 'displayName'");
-    } else if (value.isValid()) {
+    } else if (value.isValid() && !isParamRows(name)) {
         qv_dbg()->warning("%s: module possibly not implementing getParam('%s') correctly?", this->name(),
                           name ? name : "");
     }

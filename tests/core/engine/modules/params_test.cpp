@@ -3,9 +3,11 @@
 #include <climits>
 #include <cmath>
 #include <limits>
+#include <map>
 
 #include "core/measure/qvgeometry.h"
 #include "tests/support/checks.h"
+#include "tests/support/engine.h"
 
 namespace {
 
@@ -138,6 +140,67 @@ TEST(Params, RefusalSaysWhatIsTaken) {
         {"invert", Any("yes"), "'invert' takes a flag (0 or 1), not \"yes\""},
     };
     for (const auto& c : cases) EXPECT_EQ(qvParamRefusal<Settings>(rows, c.name, c.value), c.text);
+}
+
+struct BaseSettings {
+    int depth = 8, frames = 7;
+};
+constexpr QvParamRow<BaseSettings> baseRows[] = {
+    {"depth", &BaseSettings::depth, qvParamNeeded, 8, 16, "", "bits", "of a sample"},
+    {"frames", &BaseSettings::frames},
+    {.name = "byHand", .flags = qvParamByHand | qvParamWriteOnly, .help = "elsewhere", .type = Any::String},
+    {.name = "toRead", .flags = qvParamByHand | qvParamReadOnly},
+};
+
+class BaseCodec : public QvCodec {
+  public:
+    int setParam(const char* name, const Any& value) override { return QvCodec::setParam(name, value); }
+    void getParam(const char* name, Any& value) const override {
+        if (!qvGetParamRow<BaseSettings>(baseRows, base_, name, value)) QvCodec::getParam(name, value);
+    }
+    int open() override { return 0; }
+    int close() override { return 0; }
+    void* getInterface(int) const override { return nullptr; }
+    using QvCodec::getParam;
+
+  private:
+    BaseSettings base_;
+};
+
+class DerivedCodec : public BaseCodec {
+  public:
+    void getParam(const char* name, Any& value) const override {
+        if (!qvGetParamRow<Settings>(rows, settings_, name, value)) BaseCodec::getParam(name, value);
+    }
+
+  private:
+    Settings settings_;
+};
+
+// A manual is made of it: each name once, as the class has it, with what its bases add.
+TEST(Params, OfACodecAreThoseOfAllItsTables) {
+    EngineScope engine;
+    LogCapture log;
+    std::map<std::string, AnyDict> found;
+    for (const Any& row : qvParameters(DerivedCodec())) {
+        const AnyDict& described = row.asDict();
+        EXPECT_TRUE(found.emplace(described.getString("name", ""), described).second);
+    }
+    EXPECT_EQ(found.size(), std::size(rows) - 1 + std::size(baseRows) - 1) << "one is ignored, one in both";
+    EXPECT_FALSE(found.count("old"));
+    EXPECT_EQ(found["frames"].getInt32("default", 0), 25) << "of the derived class";
+    const AnyDict depth("name", "depth", "default", 8, "type", "Int32");
+    for (const auto [key, value] : depth) EXPECT_TRUE(found["depth"].get(key) == *value) << key;
+    EXPECT_TRUE(found["depth"].get("unit") == "bits" && found["depth"].get("help") == "of a sample");
+    EXPECT_TRUE(found["depth"].isSet("needed") && found["depth"].get("max").toInt32() == 16);
+    EXPECT_TRUE(found["byHand"].get("type") == "String" && !found["byHand"].isSet("readOnly"));
+    EXPECT_TRUE(found["toRead"].isSet("readOnly"));
+    // Described or not, a name by hand is the codec's own affair.
+    BaseSettings base;
+    Any value;
+    EXPECT_FALSE(qvSetParamRow<BaseSettings>(baseRows, base, "byHand", Any("x")));
+    EXPECT_FALSE(qvGetParamRow<BaseSettings>(baseRows, base, "toRead", value));
+    EXPECT_FALSE(log.contains("correctly", QvLogMask::warning));
 }
 
 }  // namespace
