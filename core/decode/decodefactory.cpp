@@ -1,12 +1,14 @@
 #include "core/decode/decodefactory.h"
 
 #include <memory>
+#include <string>
 
 #include "core/arch/qvassert.h"
 #include "core/arch/qvexception.h"
 #include "core/decode/qvdecoder.h"
 #include "core/engine/files/qvfileutil.h"
 #include "core/engine/log/qvlog.h"
+#include "core/engine/modules/params.h"
 #include "core/engine/modules/qvmodule.h"
 #include "core/engine/modules/qvregistry.h"
 #include "core/engine/status.h"
@@ -111,6 +113,44 @@ void setUp(QvDecodePipe& decoder, const Any& filename, const Any& fourcc, const 
     }
 }
 
+// Why `decoder` does not take these parameters; "" when it has taken all.
+std::string setAll(QvDecodePipe& decoder, const AnyDict& params) {
+    const std::string who = decoder.name();
+    for (const Any& row : qvParameters(decoder)) {
+        const AnyDict& described = row.asDict();
+        const char* name = described.getString("name", "");
+        if (described.isSet("needed") && !params.isSet(name)) return who + " needs '" + name + "'";
+    }
+    for (const auto [name, value] : params) {
+        int result = QvStatus::invalidParam;
+        bool known = true;
+        try {
+            result = decoder.setParam(name, *value);
+        } catch (const QvParamException&) {
+            known = false;
+        }
+        if (!known) return who + " has no parameter '" + name + "'";
+        if (result == QvStatus::ok) continue;
+        if (*decoder.errorDesc()) return who + ": " + decoder.errorDesc();
+        return who + " does not take the value of '" + name + "'";
+    }
+    return "";
+}
+
+// All decoders that list the extension, those that are never chosen by it alone as well.
+AnyVector decodersOf(const Any& extension) {
+    AnyVector modules = qv_registry()->decoders(extension.asString(""));
+    if (!modules.empty()) return modules;
+    for (int i = 0; i < qv_registry()->nrModules(0); ++i) {
+        const QvModule& module = *qv_registry()->module(i);
+        const Any extensions = module.getAttr("exts");
+        if (module.getAttr("type").toInt32() != QvModuleType::decoder || !extensions.isVector()) continue;
+        for (const Any& own : extensions.asVector())
+            if (own == extension) modules.append(Any(module.name()));
+    }
+    return modules;
+}
+
 void applyOverrides(QvDecodePipe& decoder, int type, const Any& saved) {
     if (!saved.isVector()) return;
     const AnyVector& streams = saved.asVector();
@@ -171,6 +211,48 @@ QvDecodePipe* QvDecFactory::decodePipeUsing(const Any& filename, const AnyVector
         logError(text);
         reporter.failed(text);
     }
+    return nullptr;
+}
+
+QvDecodePipe* QvDecFactory::decodePipeWith(const Any& filename, const AnyDict& params, Any* error,
+                                           const char* module, QvFileOpenCb* cb) {
+    const Any extension = extensionOf(filename);
+    const AnyVector modules = module ? AnyVector(Any(module)) : decodersOf(extension);
+    Reporter reporter(filename, cb);
+    std::string reasons;
+    const auto fail = [&](const std::string& reason) {
+        logError(Any(reason.c_str()));
+        reporter.failed(Any(reason.c_str()));
+        reasons += (reasons.empty() ? "" : "; ") + reason;
+    };
+    logOpening(filename);
+    if (modules.empty())
+        fail(std::string("Cannot find appropriate decoder for extension '") + extension.asString("") + "'.");
+    for (const Any& name : modules) {
+        std::unique_ptr<QvCodec> codec(qv_registry()->newCodec(name.asString("")));
+        auto* decoder =
+            codec ? static_cast<QvDecodePipe*>(codec->getInterface(QvModuleType::decoder)) : nullptr;
+        reporter.started(name.asString(""));
+        if (!decoder) {
+            fail(noInstance(name.asString("")).asString());
+            continue;
+        }
+        std::string reason = setAll(*decoder, params);
+        if (reason.empty()) {
+            decoder->setParam(filename.isVector() ? "filenames" : "filename", filename);
+            if (decoder->open() == QvStatus::ok) {
+                const Any text = opened(filename, decoder->name());
+                qv_dbg()->logs(QvLogMask::info, text.asString());
+                reporter.succeeded(text, 100);
+                codec.release();
+                return decoder;
+            }
+            reason = failedToOpen(filename, decoder->name()).asString();
+            if (*decoder->errorDesc()) reason += std::string(" ") + decoder->errorDesc();
+        }
+        fail(reason);
+    }
+    if (error) *error = Any(reasons.c_str());
     return nullptr;
 }
 

@@ -22,6 +22,17 @@ class QV_API QvDecFactory {
     static QvDecodePipe* decodePipeUsing(const Any& filename, const AnyVector& modules,
                                          const Any& fourcc = Any(), QvFileOpenCb* cb = nullptr,
                                          const Any* openParams = nullptr);
+    // Opens a file with parameters that the decoder has to take: `params` are names and values as of
+    // setParam, and qvParameters lists those of a decoder. One that is unknown, is refused, or is needed and
+    // not there (the size of a raw file) is an error; nothing is opened by a guess. `module` is the decoder;
+    // null: those of the extension in turn, also of files that do not describe themselves, such as ".yuv".
+    // Null if none opens the file; then `error`, which may be null, is a text with the reason.
+    //
+    //     AnyDict format("FOURCC", "I420", "width", 352, "height", 288);
+    //     Any error;
+    //     QvDecodePipe* clip = QvDecFactory::decodePipeWith(Any("clip.yuv"), format, &error);
+    static QvDecodePipe* decodePipeWith(const Any& filename, const AnyDict& params, Any* error = nullptr,
+                                        const char* module = nullptr, QvFileOpenCb* cb = nullptr);
     // Opens a decoder with the parameters and overrides that QvDecodePipe::store wrote. Asserts that `state`
     // names a module.
     //

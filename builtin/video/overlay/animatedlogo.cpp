@@ -58,13 +58,20 @@ constexpr QvParamRow<Settings> rows[] = {
      .member = &Settings::filename,
      .flags = qvParamStored,
      .description = "Movie with logo"},
-    {"decoder", &Settings::decoder, qvParamStored},
-    {"decoderParams", QvParamAccess<Settings>{setDecoderParams, getDecoderParams}, qvParamStored},
-    {"xpos", &Settings::x, qvParamStored, -mostOffset, mostOffset, "x offset (negative for right alignment)"},
-    {"ypos", &Settings::y, qvParamStored, -mostOffset, mostOffset,
-     "y offset (negative for bottom alignment)"},
+    {.name = "decoder",
+     .member = &Settings::decoder,
+     .flags = qvParamStored,
+     .help = "module that opens the movie; empty: by its extension"},
+    {.name = "decoderParams",
+     .member = QvParamAccess<Settings>{setDecoderParams, getDecoderParams},
+     .flags = qvParamStored,
+     .help = "parameters of that module, key=value;key=value"},
+    {"xpos", &Settings::x, qvParamStored, -mostOffset, mostOffset, "x offset (negative for right alignment)",
+     "pixels"},
+    {"ypos", &Settings::y, qvParamStored, -mostOffset, mostOffset, "y offset (negative for bottom alignment)",
+     "pixels"},
     {"alpha", &Settings::alpha, qvParamStored, 0, 1, "Logo opacity"},
-    {"scale", &Settings::scale, qvParamStored, 1, 1000, "Logo scale in %"},
+    {"scale", &Settings::scale, qvParamStored, 1, 1000, "Logo scale in %", "%"},
     {.name = "loop", .member = &Settings::loop, .flags = qvParamStored, .description = "Loop logo on finish"},
 };
 static_assert(qvParamTableOk<Settings>(rows));
@@ -114,7 +121,14 @@ int AnimatedLogo::openMovie() {
     const char* name = settings_.filename.c_str();
     if (settings_.filename.empty()) return setError(QvStatus::failed, "'filename' names no movie");
     const std::string& decoder = settings_.decoder;
-    if (decoder.empty())
+    if (!settings_.decoderParams.empty()) {
+        Any error;
+        movie_.reset(QvDecFactory::decodePipeWith(Any(name), settings_.decoderParams, &error,
+                                                  decoder.empty() ? nullptr : decoder.c_str()));
+        if (!movie_)
+            return setError(QvStatus::failed, "The logo movie %s can't be opened: %s", name,
+                            error.asString(""));
+    } else if (decoder.empty())
         movie_.reset(QvDecFactory::decodePipe(Any(name)));
     else if (qv_registry()->module(decoder.c_str()))
         movie_.reset(QvDecFactory::decodePipeUsing(Any(name), AnyVector(Any(decoder.c_str()))));
@@ -125,7 +139,6 @@ int AnimatedLogo::openMovie() {
         qv_dbg()->error("[animated logo] no video streams in file %s", name);
         return setError(QvStatus::failed, "The logo movie %s has no picture", name);
     }
-    movie_->setParamDict(settings_.decoderParams);
     movie_->select(qvVideoStream, 0);
     return QvStatus::ok;
 }

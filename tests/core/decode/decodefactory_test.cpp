@@ -114,4 +114,65 @@ TEST_F(Factory, RestoringNeedsNameModuleAndFile) {
     EXPECT_EQ(events.all.back(), "-1 0 Failed to create instance of decoder 'nobody'.");
 }
 
+// A file without a header is opened as what it is said to be, or not at all.
+TEST_F(Factory, ParametersAreTakenOrTheFileStaysClosed) {
+    TempFolder folder;
+    const std::string name = folder.write("a.yuv", std::string(3 * 64 * 48 * 3 / 2, 'x'));
+    const Any file(name.c_str());
+    const AnyDict format("FOURCC", "I420", "width", 64, "height", 48);
+    const auto with = [&](const char* key, const Any& value) {
+        AnyDict more = format;
+        more.set(key, value);
+        return more;
+    };
+    const auto without = [&](const char* key) {
+        AnyDict less = format;
+        less.remove(key);
+        return less;
+    };
+    const struct {
+        const char* what;
+        Any file;
+        AnyDict params;
+        const char* module;
+        const char* error;  // a part; null: it opens
+    } rows[] = {
+        {"by the extension", file, format, nullptr, nullptr},
+        {"by the module", file, with("framerate", Any(50.0)), "rawdec", nullptr},
+        {"no format", file, AnyDict(), "rawdec", "rawdec needs 'FOURCC'"},
+        {"no size", file, without("height"), nullptr, "rawdec needs 'height'"},
+        {"a name that it does not have", file, with("widht", Any(64)), nullptr,
+         "rawdec has no parameter 'widht'"},
+        {"open parameters of others", file, with("openParameters", Any(AnyDict())), nullptr,
+         "rawdec has no parameter 'openParameters'"},
+        {"a value of a wrong type", file, with("width", Any("64")), nullptr,
+         "rawdec: Invalid value of parameter 'width'"},
+        {"a size that is none", file, with("width", Any(0)), nullptr, "Invalid frame size 0x"},
+        {"an unknown format", file, with("FOURCC", Any("NOPE")), nullptr, "rawdec: "},
+        {"another decoder", file, format, "wavdec", "wavdec has no parameter 'FOURCC'"},
+        {"no decoder", file, format, "nobody", "'nobody'"},
+        {"no file", Any("/no/file.yuv"), format, nullptr,
+         "Failed to open file '/no/file.yuv' using 'rawdec'. Can not open file"},
+        {"no extension that is known", Any("a.nothing"), format, nullptr, "extension 'nothing'"},
+        {"several, of which none takes it", Any("a.fake"), format, nullptr,
+         "first has no parameter 'FOURCC'; second has no parameter 'FOURCC'"},
+        {"several without parameters", Any("a.fake"), AnyDict(), nullptr, nullptr},
+    };
+    for (const auto& row : rows) {
+        Any error;
+        events.all.clear();
+        const std::unique_ptr<QvDecodePipe> decoder(
+            QvDecFactory::decodePipeWith(row.file, row.params, &error, row.module, &events));
+        EXPECT_EQ(decoder == nullptr, row.error != nullptr) << row.what << error.asString("");
+        EXPECT_EQ(events.all.back().substr(0, 2), row.error ? "-1" : "0 ") << row.what;
+        if (row.error) {
+            EXPECT_NE(std::string(error.asString("")).find(row.error), std::string::npos)
+                << row.what << ": " << error.asString("");
+        } else if (row.file == file) {
+            EXPECT_EQ(decoder->nrFrames(0), 3) << row.what;
+        }
+    }
+    EXPECT_FALSE(QvDecFactory::decodePipeWith(file, AnyDict()));
+}
+
 }  // namespace
