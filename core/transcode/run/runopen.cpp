@@ -105,9 +105,11 @@ int QvTranscodeRun::openLinks() {
             throw;
         }
         if (result == QvStatus::ok) continue;
+        const std::string cause = link.errorDesc();
         // The failed link is closed once for each one before it; those stay open until the next run.
         for (int k = 0; k < i; ++k) link.close();
-        return t_.setError(QvStatus::failed, "Can not open transcode link");
+        return t_.setError(QvStatus::failed, "Can not open transcode link%s%s", cause.empty() ? "" : ": ",
+                           cause.c_str());
     }
     return QvStatus::ok;
 }

@@ -120,7 +120,7 @@ TEST_F(Transcoder, WhatCantBeOpenedIsToldAndCanBeMended) {
         const char* events;
     } rows[] = {
         {[](Job& j, bool broken) { j.pipe.audios[0]->params.set("samplerate", broken ? 0 : 48000); }, -1,
-         "Can not open transcode link", ""},
+         "Can not open transcode link: Could not get 'samplerate' from encoder", ""},
         {[](Job& j, bool broken) { j.decoder.seekResult = -broken; }, -1,
          "Seek input video #0 to 0.000000 failed, aborting", ""},
         {[](Job& j, bool broken) { j.pipe.openResult = -77 * broken; }, -77, "open failed", "open"},
