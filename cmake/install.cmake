@@ -17,6 +17,7 @@ foreach(row ${QV_FORMER_HEADERS})
        CONTENT "// Its place is ${CMAKE_MATCH_2} now.\n#pragma once\n\n#include \"${CMAKE_MATCH_2}\"\n")
 endforeach()
 install(DIRECTORY ${CMAKE_BINARY_DIR}/former/core DESTINATION ${QV_INCLUDE_ROOT})
+install(DIRECTORY ${CMAKE_SOURCE_DIR}/docs/ DESTINATION ${CMAKE_INSTALL_DOCDIR} FILES_MATCHING PATTERN "*.md")
 install(EXPORT qvplugcore-targets DESTINATION ${CMAKE_INSTALL_LIBDIR}/cmake/qvplugcore)
 
 file(WRITE ${CMAKE_BINARY_DIR}/qvplugcore-config.cmake

@@ -3,6 +3,7 @@
 #include <cerrno>
 #include <cmath>
 #include <cstdio>
+#include <filesystem>
 
 #include "tarsel/commands/commands.h"
 #include "tarsel/commands/outputoptions.h"
@@ -13,7 +14,10 @@
 #include "tarsel/source/source.h"
 #include "tarsel/words/commandline.h"
 #include "tarsel/words/messages.h"
+#include "tarsel/words/numberedname.h"
 #include "tarsel/words/timespec.h"
+
+namespace fs = std::filesystem;
 
 namespace {
 
@@ -105,6 +109,8 @@ void frame(Given& given) {
     given.stream = StreamOutput::find(given.output, {given.input});
     const Any extension = QvFile::getExt(Any(given.output.c_str()), true);
     if (!given.stream && !(extension == "png")) throw failure(Msg::pictureName, {given.output});
+    if (!given.stream && NumberedName::parse(fs::path(given.output).filename().string()))
+        throw failure(Msg::pictureNumbered, {given.output});
     Source source(given.input, given.raw);
     if (!given.stream)
         given.outputs = std::make_shared<Outputs>(given.output, "-o", std::vector{given.input}, policy);

@@ -27,7 +27,8 @@ void describeText(const AnyDict& p, Json& stream) {
     if (p.get("textEncoding").isText()) stream["encoding"] = text(p.get("textEncoding"));
     if (p.get("count").isInt()) stream["subtitles"] = p.get("count").toInt64();
     if (p.get("framerate").isFramerate() && p.getInt32("format", QvSubtitles::SUB) == QvSubtitles::SUB)
-        stream["timecode"] = text(p.get("framerate").asFramerate().desc(true, false));
+        stream["timecode"] = formatRate(p.get("framerate").asFramerate()) +
+                             (p.get("framerate").asFramerate().df() ? " drop frame" : "");
     const Any& end = p.isSet("end") ? p.get("end") : p.get("last");
     if (!p.get("first").isMediaTime() || !end.isMediaTime()) return;
     stream["first_s"] = p.get("first").asMediaTime().seconds();
@@ -50,6 +51,7 @@ Json describeStream(const QvDecodePipe& decoder, int type, int number) {
         integer("height", "height");
         if (p.get("framerate").isFramerate()) {
             const QvFramerate rate = p.get("framerate").asFramerate();
+            stream["rate_text"] = formatRate(rate);
             stream["rate"] = std::to_string(rate.rate().num) + "/" + std::to_string(rate.rate().den);
             stream["scan"] = rate.interlaced() == 0 ? "progressive"
                              : rate.isTopFirst()    ? "top first"
@@ -95,7 +97,8 @@ std::string streamLine(const Json& s) {
     if (s["type"] == "video") {
         if (s["pixel"] != line) add(s["pixel"].get<std::string>());
         if (s.contains("width") && s.contains("height")) add(number("width") + "x" + number("height"));
-        if (s.contains("rate")) add(s["rate"].get<std::string>() + " fps " + s["scan"].get<std::string>());
+        if (s.contains("rate"))
+            add(s["rate_text"].get<std::string>() + " fps, " + s["scan"].get<std::string>());
         if (s.contains("frames")) add(number("frames") + " frames");
         if (s.contains("views") && s["views"] != 1) add(number("views") + " views");
     } else if (s["type"] == "subpicture") {

@@ -1,45 +1,12 @@
-// What this installation can do: modules, presets and formats.
-#include <map>
-
+// What this installation can do: presets and formats.
 #include "tarsel/commands/commands.h"
 #include "tarsel/host/console.h"
 #include "tarsel/words/commandline.h"
 #include "tarsel/words/json.h"
+#include "tarsel/words/rawnames.h"
 #include "tarsel/words/timespec.h"
 
 namespace {
-
-const char* kindName(int kind) {
-    switch (kind) {
-        case 2: return "decoder";
-        case 3: return "encode pipe";
-        case 5: return "sink";
-        case 6: return "audio encoder";
-        case 7: return "video encoder";
-        case 10: return "multiplexer";
-        case 12: return "video filter";
-        case 13: return "audio filter";
-        case 14: return "video pipe";
-        case 16: return "audio pipe";
-    }
-    return "other";
-}
-
-Json modules() {
-    Json list = Json::array();
-    for (int i = 0; i < qv_registry()->nrModules(0); ++i) {
-        QvModule& module = *qv_registry()->module(i);
-        std::unique_ptr<QvCodec> codec(qv_registry()->newCodec(module.name()));
-        Json row;
-        row["name"] = module.name();
-        row["kind"] = kindName(module.getAttr("type").toInt32());
-        row["description"] = module.desc();
-        row["plugin"] = module.plugin() ? module.plugin()->name() : "";
-        row["usable"] = codec != nullptr;
-        list.push_back(std::move(row));
-    }
-    return list;
-}
 
 Json presets() {
     Json list = Json::array();
@@ -68,9 +35,7 @@ struct Output {
 
 constexpr Output kOutputs[] = {
     {"wav", "PCM sound, 8 to 24 bits, 1 to 8 channels", "rawmux"},
-    {"png", "one picture a frame, NAME#0.png; sound beside them in NAME.wav", "scaler"},
-    {"raw yuv rgb i420 yv12 yuy2 yuyv uyvy bgr3 bgr4 bgra argb v210",
-     "raw frames one behind the other; sound beside them in NAME.wav", "rawmux"},
+    {"png", "one picture a frame, NAME#0.png, or as NAME_%04d.png says; sound in NAME.wav", "scaler"},
     {"avi", "uncompressed pictures and sound in one file", "rawavimux"},
 };
 
@@ -93,6 +58,19 @@ Json formats() {
     for (const Output& output : kOutputs)
         if (std::unique_ptr<QvCodec>(qv_registry()->newCodec(output.module)))
             result["outputs"].push_back({{"extensions", output.extensions}, {"description", output.what}});
+    std::string raw;
+    result["raw_names"] = Json::array();
+    for (const RawName& name : rawNames()) {
+        raw += (raw.empty() ? "" : " ") + std::string(name.extension);
+        result["raw_names"].push_back({{"extension", name.extension},
+                                       {"fourcc", name.fourcc ? Json(fourccText(name.fourcc)) : Json()},
+                                       {"description", name.bytes}});
+    }
+    result["outputs"].push_back(
+        {{"extensions", raw}, {"description", "raw frames one after the other; sound in NAME.wav"}});
+    result["open_names"] = Json::array();
+    for (const OpenName& name : openNames())
+        result["open_names"].push_back({{"extension", name.extension}, {"instead", name.instead}});
     result["pixels"] = Json::array();
     for (const QvPixelFormat& format : qvPixelFormats())
         result["pixels"].push_back({{"fourcc", fourccText(format.fourcc)}});
@@ -120,15 +98,6 @@ void add(CommandLine& line, const char* name, const char* help, Json (*make)(), 
 
 }  // namespace
 
-void addModules(CommandLine& line) {
-    add(line, "modules", "List the modules of the library and its plug-ins", modules, [](const Json& list) {
-        for (const auto& m : list)
-            print("%-13s %-14s %s%s\n", m["name"].get<std::string>().c_str(),
-                  m["kind"].get<std::string>().c_str(), m["description"].get<std::string>().c_str(),
-                  m["usable"].get<bool>() ? "" : "  (not usable)");
-    });
-}
-
 void addPresets(CommandLine& line) {
     add(line, "presets", "List the presets that the installed modules allow", presets, [](const Json& list) {
         for (const auto& p : list)
@@ -147,6 +116,14 @@ void addFormats(CommandLine& line) {
         for (const auto& o : data["outputs"])
             print("  %s\n      %s\n", o["extensions"].get<std::string>().c_str(),
                   o["description"].get<std::string>().c_str());
+        print("Names of raw files and what is in them\n");
+        for (const auto& n : data["raw_names"])
+            print("  .%-5s %-5s %s\n", n["extension"].get<std::string>().c_str(),
+                  n["fourcc"].is_null() ? "" : n["fourcc"].get<std::string>().c_str(),
+                  n["description"].get<std::string>().c_str());
+        for (const auto& n : data["open_names"])
+            print("  .%-5s -     does not say the order of its bytes; use %s\n",
+                  n["extension"].get<std::string>().c_str(), n["instead"].get<std::string>().c_str());
         print("Pixel formats\n ");
         for (const auto& p : data["pixels"]) print(" %s", p["fourcc"].get<std::string>().c_str());
         print("\n");

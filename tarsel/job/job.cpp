@@ -2,11 +2,13 @@
 
 #include <algorithm>
 #include <cstdio>
+#include <filesystem>
 #include <new>
 #include <set>
 
 #include "tarsel/host/files.h"
 #include "tarsel/words/messages.h"
+#include "tarsel/words/rawnames.h"
 #include "tarsel/words/timespec.h"
 
 namespace {
@@ -16,17 +18,15 @@ constexpr int kVideo = 1, kAudio = 2;
 constexpr int kVideoFilter = 12, kAudioFilter = 13;
 
 struct KindRow {
-    const char* extension;
+    std::string_view extension;
     OutputKind kind;
 };
 
+// Beside the names of raw files.
 constexpr KindRow kKinds[] = {
-    {"wav", OutputKind::wav},  {"png", OutputKind::pictures}, {"avi", OutputKind::avi},
-    {"raw", OutputKind::raw},  {"yuv", OutputKind::raw},      {"rgb", OutputKind::raw},
-    {"i420", OutputKind::raw}, {"yv12", OutputKind::raw},     {"yuy2", OutputKind::raw},
-    {"yuyv", OutputKind::raw}, {"uyvy", OutputKind::raw},     {"bgr3", OutputKind::raw},
-    {"bgr4", OutputKind::raw}, {"bgra", OutputKind::raw},     {"argb", OutputKind::raw},
-    {"v210", OutputKind::raw},
+    {"wav", OutputKind::wav},
+    {"png", OutputKind::pictures},
+    {"avi", OutputKind::avi},
 };
 
 int intParam(const QvDecodePipe& decoder, int type, int stream, const char* name) {
@@ -69,20 +69,52 @@ bool Job::writesNothing() const { return kind_ == OutputKind::nothing || (stream
 
 bool Job::takesOneStream() const { return stream_ && !stream_->discards(); }
 
+// "ext" of --format, or of the output's name.
+std::string Job::formatName() const {
+    return extensionOf(options_.format.empty() ? options_.output : "x." + options_.format);
+}
+
 OutputKind Job::chosenKind() const {
     const bool named = !options_.format.empty();
-    const std::string extension =
-        QvFile::getExt(Any(((named ? "x." + options_.format : options_.output)).c_str()), true).asString();
+    const std::string extension = formatName();
     for (const KindRow& row : kKinds)
         if (extension == row.extension) return row.kind;
+    if (rawName(extension)) return OutputKind::raw;
     std::vector<std::string> known;
-    for (const auto& row : kKinds) known.push_back(row.extension);
+    for (const auto& row : kKinds) known.emplace_back(row.extension);
+    for (const auto& row : rawNames()) known.emplace_back(row.extension);
     const std::string near = suggestion(extension, known), hint = near.empty() ? near : "." + near;
+    if (const OpenName* open = openName(extension))
+        throw failure(Msg::outputNameOpen, {outputName(), extension, open->instead});
     if (named) throw failure(Msg::formatUnknown, {options_.format, hint});
     if (options_.output == "-") throw failure(Msg::streamNeedsFormat);
     if (stream_) return OutputKind::byInput;
     if (extension.empty()) throw failure(Msg::outputFormatMissing, {options_.output});
     throw failure(Msg::outputFormatUnknown, {options_.output, extension, hint});
+}
+
+// A name such as "x.uyvy" says the pixel format.
+void Job::choosePixel() {
+    const RawName* name = kind_ == OutputKind::raw ? rawName(formatName()) : nullptr;
+    if (!name || name->fourcc == 0) return;
+    std::string& pixel = options_.effects.pixel;
+    if (pixel.empty()) pixel = fourccText(name->fourcc);
+    const unsigned fourcc = parsePixel(pixel, "--pixel");
+    if (nameAllows(*name, fourcc, false)) return;
+    const std::string shown = options_.format.empty() ? options_.output : "--format " + options_.format;
+    throw failure(Msg::outputNameSays, {pixel, shown, fourccText(name->fourcc), extensionFor(fourcc)});
+}
+
+// Numbered names are those of pictures, of channels, and of several streams.
+void Job::chooseNumbers() {
+    if (kind_ == OutputKind::avi) return;
+    const std::filesystem::path output(options_.output);
+    const std::string name = output.filename().string();
+    const bool pictures = kind_ == OutputKind::pictures;
+    numbered_ = pictures ? NumberedName::parseStrictly(name) : NumberedName::parse(name);
+    if (numbered_ && !options_.saveTask.empty()) throw failure(Msg::numberNotStored, {options_.output});
+    if (pictures && !numbered_)
+        options_.output = std::filesystem::path(output).replace_filename(withoutEscapes(name)).string();
 }
 
 void Job::chooseOutput() {
@@ -93,9 +125,12 @@ void Job::chooseOutput() {
     if (options_.output.empty()) throw Failure(Exit::usage, "no output; give its name with -o FILE");
     stream_ = StreamOutput::find(options_.output, options_.inputs);
     kind_ = chosenKind();
+    choosePixel();
     if (takesOneStream()) checkStream();
     if (stream_) return;
+    chooseNumbers();
     outputs_ = std::make_unique<Outputs>(options_.output, "-o", options_.inputs, options_.policy);
+    if (numbered_) outputs_->number(*numbered_);
     if (kind_ == OutputKind::pictures) outputs_->checkNumbered("png");
     if (options_.splitChannels) outputs_->checkNumbered("wav");
 }
@@ -158,11 +193,28 @@ void Job::planStreams() {
         throw failure(kind_ == OutputKind::wav ? Msg::inputNoSound : Msg::inputNoStreams, {outputName()});
     if (kind_ == OutputKind::byInput) kind_ = hasVideo() ? OutputKind::raw : OutputKind::wav;
     checkPicture();
+    if (outputs_) checkCounts();
     // As captions, of which raw pictures hold none.
     for (const auto& source : sources_)
         if (std::none_of(streams_.begin(), streams_.end(),
                          [&](const auto& s) { return s.source == source.get(); }))
             warnings_.push_back(lineOf(Msg::inputUnused, {source->name()}));
+}
+
+// What has a file of its own is one, or is numbered as the user says.
+void Job::checkCounts() const {
+    if (kind_ == OutputKind::avi) return;
+    for (const int type : {kVideo, kAudio}) {
+        const auto count =
+            std::count_if(streams_.begin(), streams_.end(), [&](const auto& s) { return s.type == type; });
+        const char* what = type == kVideo ? "picture" : "sound";
+        if (count < 2) continue;
+        if (kind_ == OutputKind::pictures || options_.splitChannels)
+            throw failure(Msg::outputTakesOne, {options_.output, what, std::to_string(count)});
+        if (!numbered_)
+            throw failure(Msg::outputHoldsOne,
+                          {options_.output, what, std::to_string(count), numberedLike(options_.output)});
+    }
 }
 
 void Job::checkPicture() const {
@@ -322,7 +374,7 @@ void Job::addStream(JobStream& stream) {
 void Job::checkNames() const {
     if (!outputs_) return;
     if (kind_ == OutputKind::pictures || options_.splitChannels ||
-        (kind_ != OutputKind::avi && streams_.size() > 1))
+        (kind_ != OutputKind::avi && streams_.size() > 1) || numbered_)
         outputs_->expectSet();
     pipe_->setFilename(Any(outputs_->hiddenName(primaryExtension()).c_str()));
     const Any names = pipe_->getMuxer()->QvCodec::getParam("filenames");

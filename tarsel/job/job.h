@@ -16,6 +16,7 @@
 #include "tarsel/picture/picture.h"
 #include "tarsel/source/source.h"
 #include "tarsel/words/failure.h"
+#include "tarsel/words/numberedname.h"
 #include "tarsel/words/timespec.h"
 
 struct JobOptions {
@@ -80,6 +81,9 @@ class Job {
     void openInputs();
     void chooseOutput();
     OutputKind chosenKind() const;
+    std::string formatName() const;
+    void choosePixel();
+    void chooseNumbers();
     void checkStream() const;
     void planStreams();
     void planStream(Source& source, int type, int number);
@@ -92,6 +96,7 @@ class Job {
     void checkEffects() const;
     void takeWarnings();
     void checkPicture() const;
+    void checkCounts() const;
     void buildPipe();
     void addStream(JobStream& stream);
     void checkNames() const;
@@ -127,6 +132,7 @@ class Job {
     OutputKind kind_ = OutputKind::raw;
     std::vector<std::unique_ptr<Source>> sources_;
     std::vector<JobStream> streams_;
+    std::optional<NumberedName> numbered_;
     std::unique_ptr<Outputs> outputs_, taskFile_;        // no `outputs_` where there is a `stream_`
     std::vector<std::unique_ptr<Outputs>> filterFiles_;  // what filters write
     std::unique_ptr<StreamOutput> stream_;

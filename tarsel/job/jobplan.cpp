@@ -11,7 +11,7 @@ namespace {
 std::string formatOf(const JobStream& s) {
     if (s.type == 1)
         return std::to_string(s.width) + "x" + std::to_string(s.height) + " " + fourccText(s.fourcc) + " " +
-               s.rate.desc(true, true).asString();
+               formatRate(s.rate);
     return std::to_string(s.samplerate) + " Hz, " + std::to_string(s.channels) + " ch, " +
            std::to_string(s.bits) + " bit";
 }

@@ -131,8 +131,7 @@ void setStart(QvCodec& filter, const std::string& text, const PictureFormat& pic
     const MediaTime start = parseTime(text, picture.rate, option);
     const bool drop = text.find(';') != std::string::npos;
     const bool ntsc = picture.rate.is29p() || picture.rate.is59i() || picture.rate.is59p();
-    if (drop && !ntsc)
-        throw failure(Msg::dropFrameNone, {option, text, picture.rate.desc(true, true).asString()});
+    if (drop && !ntsc) throw failure(Msg::dropFrameNone, {option, text, formatRate(picture.rate)});
     if (drop) setChecked(filter, "dropFrame", 1, option);
     setChecked(filter, "start", alone ? "InPoint" : "FirstInputFrame", option);
     setChecked(filter, "startOffset", static_cast<int>(-start.position(picture.rate)), option);

@@ -10,18 +10,14 @@
 #include "tarsel/picture/overlays.h"
 #include "tarsel/words/keyvalues.h"
 #include "tarsel/words/messages.h"
+#include "tarsel/words/rawnames.h"
 #include "tarsel/words/timespec.h"
+#include "tarsel/words/valuetext.h"
 
 namespace {
 
 constexpr int kVideo = 1, kAudio = 2;
 constexpr int kVideoFilter = 12, kAudioFilter = 13, kVideoEncoder = 7;
-
-bool isYuv(unsigned fourcc) {
-    const QvPixelFormat* format = qvPixelFormat(fourcc);
-    return format && !format->rgb && fourcc != QvFourcc::b64a && fourcc != QvFourcc::R32C &&
-           fourcc != QvFourcc::R555 && fourcc != QvFourcc::R565;
-}
 
 // The format in which the encoder of an output wants its frames; BGR3 if it can't write that output.
 unsigned frameFormat(unsigned fourcc) {
@@ -316,26 +312,6 @@ void tryFilter(QvVideoFilter& filter) {
     throw failure(Msg::filterRefused, {filter.name(), reason});
 }
 
-std::string textOf(const Any& value) {
-    if (value.isText()) {
-        const Any text = value.toString();
-        return inQuotes(text.asString(""));
-    }
-    char text[64];
-    switch (value.type()) {
-        case Any::Int32:
-        case Any::Int64: return std::to_string(value.toInt64());
-        case Any::Float: std::snprintf(text, sizeof text, "%g", value.asFloat()); return text;
-        case Any::Point:
-            return std::to_string(value.asPoint().x()) + "," + std::to_string(value.asPoint().y());
-        case Any::Rect:
-            return std::to_string(value.asRect().width()) + "x" + std::to_string(value.asRect().height()) +
-                   "+" + std::to_string(value.asRect().left()) + "+" + std::to_string(value.asRect().top());
-        case Any::Framerate: return value.asFramerate().desc(true, true).asString();
-        default: return "";
-    }
-}
-
 // What differs from the values that a filter begins with.
 void addSettings(const AnyDict& state, const AnyDict& initial, std::string& line) {
     for (int i = 0; i < state.size(); ++i) {
@@ -345,7 +321,7 @@ void addSettings(const AnyDict& state, const AnyDict& initial, std::string& line
         if (key[0] == '_' || key == "name" || value == before) continue;
         if (value.isDict())
             addSettings(value.asDict(), before.isDict() ? before.asDict() : AnyDict(), line);
-        else if (const std::string text = textOf(value); !text.empty())
+        else if (const std::string text = valueText(value); !text.empty())
             line.append(" ").append(key).append("=").append(text);
     }
 }

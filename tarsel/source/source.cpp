@@ -9,6 +9,7 @@
 #include "tarsel/source/wavformat.h"
 #include "tarsel/words/keyvalues.h"
 #include "tarsel/words/messages.h"
+#include "tarsel/words/rawnames.h"
 #include "tarsel/words/timespec.h"
 
 namespace {
@@ -77,12 +78,11 @@ std::unique_ptr<QvCodec> makeAnyCodec(const std::string& module, int kind) {
 
 namespace {
 
-std::vector<std::string> storedNames(const QvCodec& codec) {
-    AnyDict state;
-    codec.store(state);
+std::vector<std::string> parameterNames(const QvCodec& codec) {
     std::vector<std::string> names;
-    for (int i = 0; i < state.size(); ++i)
-        if (const std::string name = state.getKey(i); name[0] != '_') names.push_back(name);
+    for (const Any& row : qvParameters(codec))
+        if (const std::string name = row.asDict().getString("name", "_"); name[0] != '_')
+            names.push_back(name);
     return names;
 }
 
@@ -94,7 +94,7 @@ void setChecked(QvCodec& codec, const std::string& name, const Any& value, const
         result = codec.setParam(name.c_str(), value);
     } catch (const QvParamException&) {
         throw failure(Msg::parameterUnknown,
-                      {what, codec.name(), name, suggestion(name, storedNames(codec))});
+                      {what, codec.name(), name, suggestion(name, parameterNames(codec)), codec.name()});
     }
     if (result == QvStatus::ok) return;
     const std::string reason = codec.errorDesc();
@@ -179,22 +179,30 @@ void Source::openRaw(const std::string& raw) {
     const std::string option = "--raw";
     const KeyValues keys(raw, kRawKeys, option);
     const std::string *size = keys.find("size"), *pixel = keys.find("pixel"), *rate = keys.find("rate");
-    if (!size || !pixel) throw failure(Msg::rawIncomplete);
+    const std::string extension = extensionOf(name_);
+    const RawName* name = rawName(extension);
+    if (!size || (!pixel && !openName(extension) && (!name || name->fourcc == 0)))
+        throw failure(Msg::rawIncomplete);
+    if (!pixel && openName(extension)) throw failure(Msg::rawNameOpen, {name_});
     decoder_ = makeCodec<QvDecodePipe>("rawdec", kDecoder);
     QvDecodePipe& d = *decoder_;
     const Size dimensions = parseSize(*size, option + " size");
-    const unsigned fourcc = parsePixel(*pixel, option + " pixel");
+    const unsigned fourcc = pixel ? parsePixel(*pixel, option + " pixel") : name->fourcc;
+    if (name && !nameAllows(*name, fourcc, true))
+        throw failure(Msg::rawNameSays, {*pixel, name_, fourccText(name->fourcc)});
     requireFrame(option + " size", fourcc, dimensions.width, dimensions.height);
     setChecked(d, "filename", name_.c_str(), option);
     setChecked(d, "FOURCC", static_cast<int>(fourcc), option + " pixel");
     setChecked(d, "width", dimensions.width, option + " size");
     setChecked(d, "height", dimensions.height, option + " size");
-    setChecked(d, "framerate", Any(parseRate(rate ? *rate : "25", option + " rate")), option + " rate");
+    QvFramerate framerate = parseRate(rate ? *rate : "25", option + " rate");
+    if (const auto* order = keys.find("interlaced")) {
+        framerate.setInterlaced(static_cast<int>(parseNumber(*order, 0, 2, option + " interlaced")));
+        requireFrames(framerate, rate ? *rate : "25", option + " rate");
+    }
+    setChecked(d, "framerate", Any(framerate), option + " rate");
     if (const auto* offset = keys.find("offset"))
         setChecked(d, "offset", parseNumber(*offset, 0, 1LL << 62, option + " offset"), option + " offset");
-    if (const auto* order = keys.find("interlaced"))
-        setChecked(d, "interlacedFlag", static_cast<int>(parseNumber(*order, 0, 2, option + " interlaced")),
-                   option + " interlaced");
     if (const auto* invert = keys.find("invert"))
         setChecked(d, "invert", static_cast<int>(parseNumber(*invert, 0, 1, option + " invert")),
                    option + " invert");
@@ -204,7 +212,7 @@ void Source::openRaw(const std::string& raw) {
     if (const auto* aspect = keys.find("aspect"))
         setChecked(d, "frameAspect", parseAspect(*aspect, option + " aspect"), option + " aspect");
     if (d.open() != QvStatus::ok) refuse(d.errorDesc());
-    if (d.nrFrames(0) == 0) throw failure(Msg::rawTooShort, {name_, *size, *pixel});
+    if (d.nrFrames(0) == 0) throw failure(Msg::rawTooShort, {name_, *size, fourccText(fourcc)});
 }
 
 namespace {
@@ -244,6 +252,7 @@ void Source::openFile() {
     if (candidates.empty()) {
         for (int i = 0; i < exts->size(); ++i)
             if (exts->at(i) == ext) throw failure(Msg::inputIsRaw, {name_});
+        if (rawName(ext.asString("")) || openName(ext.asString(""))) throw failure(Msg::inputIsRaw, {name_});
         throw failure(Msg::inputUnknown, {name_, ext.asString()});
     }
     refuseFile(candidates.at(0).asString());

@@ -149,8 +149,8 @@ class WordCheck {
 
 }  // namespace
 
-void Command::argument(const char* name, std::string& to, const char* help) {
-    app_.add_option(name, to, help)->required();
+void Command::argument(const char* name, std::string& to, const char* help, Need need) {
+    app_.add_option(name, to, help)->required(need == Need::required);
 }
 
 void Command::arguments(const char* name, std::vector<std::string>& to, const char* help, int most) {

@@ -59,7 +59,7 @@ class Command {
     Command(CLI::App& app, CommandLine& line) : app_(app), line_(line) {}
 
     // The words that are no options: one, or up to `most` of them, and at least one.
-    void argument(const char* name, std::string& to, const char* help);
+    void argument(const char* name, std::string& to, const char* help, Need need = Need::required);
     void arguments(const char* name, std::vector<std::string>& to, const char* help,
                    int most = 0);  // 0: any number
 

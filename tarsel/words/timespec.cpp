@@ -3,6 +3,7 @@
 #include <charconv>
 #include <cmath>
 #include <cstdio>
+#include <iterator>
 #include <vector>
 
 #include "tarsel/words/messages.h"
@@ -92,24 +93,84 @@ MediaTime parseTime(std::string_view text, const std::optional<QvFramerate>& rat
     return *time;
 }
 
+namespace {
+
+// Rates that have a name, and those that are written with fewer digits than they have.
+constexpr struct {
+    std::string_view name;
+    int num, den;
+} kRateNames[] = {
+    {"pal", 25, 1},
+    {"ntsc", 30000, 1001},
+    {"film", 24, 1},
+    {"ntsc-film", 24000, 1001},
+};
+constexpr int kNtscRates[] = {24, 30, 48, 60, 120};  // times 1000/1001
+
+// 23.976, 23.98 and 29.97 as the exact rates that they stand for.
+std::optional<QvRatio> ntscRate(double value) {
+    for (const int rate : kNtscRates)
+        if (std::abs(value - rate * 1000 / 1001.0) < 0.005) return QvRatio(rate * 1000, 1001);
+    return std::nullopt;
+}
+
+std::optional<QvRatio> ratioOf(std::string_view text) {
+    for (const auto& row : kRateNames)
+        if (text == row.name) return QvRatio(row.num, row.den);
+    if (const auto parts = split(text, "/"); parts.size() == 2) {
+        const auto num = number(parts[0]), den = number(parts[1]);
+        if (!num || !den || *num < 1 || *den < 1 || *num > 100000000 || *den > 1000000) return std::nullopt;
+        return QvRatio(static_cast<int>(*num), static_cast<int>(*den));
+    }
+    double value = 0;
+    const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), value);
+    if (error != std::errc() || end != text.data() + text.size() || !(value >= 0.001 && value <= 100000))
+        return std::nullopt;
+    if (const auto ntsc = ntscRate(value)) return ntsc;
+    return QvFramerate(value).rate();
+}
+
+}  // namespace
+
 QvFramerate parseRate(std::string_view text, std::string_view option) {
-    const auto refuse = [&] { throw failure(Msg::rateWrong, {option, text}); };
     std::string_view digits = text;
     int interlaced = 0;
     if (!digits.empty() && (digits.back() == 'i' || digits.back() == 'b' || digits.back() == 'p')) {
         interlaced = digits.back() == 'i' ? 1 : digits.back() == 'b' ? 2 : 0;
         digits.remove_suffix(1);
     }
-    if (const auto parts = split(digits, "/"); parts.size() == 2) {
-        const auto num = number(parts[0]), den = number(parts[1]);
-        if (!num || !den || *num < 1 || *den < 1 || *num > 100000000 || *den > 1000000) refuse();
-        return QvFramerate(QvRatio(static_cast<int>(*num), static_cast<int>(*den)), interlaced);
+    const auto ratio = ratioOf(digits);
+    if (!ratio) throw failure(Msg::rateWrong, {option, text});
+    const QvFramerate rate(*ratio, interlaced);
+    requireFrames(rate, text, option);
+    return rate;
+}
+
+// No material has more than 30 interlaced frames a second.
+void requireFrames(const QvFramerate& rate, std::string_view text, std::string_view option) {
+    if (rate.interlaced() == 0) return;
+    const QvFramerate half(QvRatio(rate.rate().num, rate.rate().den * 2), rate.interlaced());
+    for (const QvFramerate& known : {QvFramerate::f23p(), QvFramerate::f24p(), QvFramerate::f25p(),
+                                     QvFramerate::f29p(), QvFramerate::f30p()})
+        if (half.rate() == known.rate()) throw failure(Msg::rateOfFields, {option, text, formatRate(half)});
+}
+
+std::string formatRate(const QvFramerate& rate) {
+    const char* const scan = rate.interlaced() == 0 ? "" : rate.isTopFirst() ? "i" : "b";
+    const QvRatio exact = rate.rate();
+    if (exact.den == 1) return std::to_string(exact.num) + scan;
+    for (int decimals = 1; decimals <= 3; ++decimals) {
+        char text[32];
+        const double value = exact;
+        const auto written = std::to_chars(text, std::end(text), value, std::chars_format::fixed, decimals);
+        double shown = 0;
+        std::from_chars(text, written.ptr, shown);
+        if (std::abs(shown - value) > 0.0005) continue;  // 23.98 would do, but 23.976 is what people know
+        const auto read = ratioOf({text, written.ptr});
+        if (read && read->num == exact.num && read->den == exact.den)
+            return std::string(text, written.ptr) + scan;
     }
-    double value = 0;
-    const auto [end, error] = std::from_chars(digits.data(), digits.data() + digits.size(), value);
-    if (error != std::errc() || end != digits.data() + digits.size() || !(value >= 0.001 && value <= 100000))
-        refuse();
-    return QvFramerate(value, interlaced);
+    return std::to_string(exact.num) + "/" + std::to_string(exact.den) + scan;
 }
 
 Size parseSize(std::string_view text, std::string_view option, int most, Msg wrong) {

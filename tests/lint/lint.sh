@@ -74,6 +74,9 @@ readme_commands() {
     python3 tests/lint/readme_commands.py
 }
 
+# Documents that are made from the tool and the examples.
+tables() { python3 tests/lint/tables.py $build/bin/tarsel; }
+
 check 'format' formatted
 check 'warnings' no_warnings
 check 'headers alone' headers_alone
@@ -81,6 +84,7 @@ check 'rooms' rooms
 check "the system's door" door
 check 'exported symbols' exported_symbols
 check 'README commands' readme_commands
+check 'documents' tables
 check 'clang-tidy' tidy
 
 [ $bad = 0 ] && echo 'lint: clean' || echo 'lint: see above'

@@ -27,7 +27,8 @@ REFUSED = [
     (CLIP, "--subtitle-style", NUMBERS), (CARD, "--progress", ["", "x", "JSON "]),
     (FRAME, "--at", NUMBERS), (FRAME, "--sheet", [*NUMBERS, "0x0", "33x33", "1x-1", "65535x65535"]),
     (["transcode", "clip.yuv", "-o", "part.yuv", "-y"], "--raw",
-     [*NUMBERS, "size=0x0", "size=64x48", "size=64x48,pixel=none,rate=25", "size=64x48,pixel=I420,rate=0",
+     [*NUMBERS, "size=0x0", "pixel=I420", "size=64x48,pixel=UYVY4", "size=64x48,pixel=BGR3",
+      "size=64x48,pixel=none,rate=25", "size=64x48,pixel=I420,rate=0", "size=64x48,rate=50i",
       "size=65535x65535,pixel=I420,rate=25,offset=-1", "size=64x48,size=32x24,pixel=I420,rate=25", "=,=,=", ",,,"]),
     (CARD, "--flip", ["3", "no"]), (CARD, "--nosuch", ["1"]),
 ]

@@ -61,7 +61,7 @@ TEST_F(Captions, InfoTellsWhatATextFileHolds) {
         const char* line;
     } rows[] = {
         {"a.scc", "Scenarist_SCC V1.0\n\n00:00:10;00 9420\n00:01:00;02 942f", 0,
-         "CEA-608, 29.97p DF, 1801 frames, 2 pairs, 0:00:10.010 to 0:01:00.060\n"},
+         "CEA-608, 29.97 drop frame, 1801 frames, 2 pairs, 0:00:10.010 to 0:01:00.060\n"},
         {"a.srt", one + "2\n01:00:00,000 --> 01:00:01,000\n\xC3\xA9\n", 0,
          "SubRip, UTF-8, 2 subtitles, 0:00:01.500 to 1:00:01.000\n"},
         {"c.srt", one + "2\nno times\n\nmore\n", 3,

@@ -51,8 +51,8 @@ TEST_F(Command, TheWholeLine) {
         {{"transcode"}, "INPUT is missing: the command needs it" + help},
         {{"frame", "testgen"}, "--output is missing: the command needs it; see 'tarsel frame --help'"},
         {{"transcode", "--foo"}, "unknown option '--foo': the command has none of this name" + help},
-        {{"modules", "x"},
-         "unknown argument 'x': the command takes no further one; see 'tarsel modules --help'"},
+        {{"presets", "x"},
+         "unknown argument 'x': the command takes no further one; see 'tarsel presets --help'"},
         {{"transcode", "in.wav", "--from"}, "--from: it needs a value; give --from=TIME"},
         {{"transcode", "in.wav", "--from=", "-o", "x.wav"}, "--from: it needs a value; give --from=TIME"},
         {{"transcode", "in.wav", "-o", ""}, "--output: it needs a value; give --output=FILE"},
@@ -143,7 +143,7 @@ TEST_F(Command, ThePlanIsToldAndNothingDone) {
     const Outcome o = works({"transcode", "testgen:size=64x64,rate=25,duration=4", "--from", "1", "--to", "3",
                              "-o", "x.yuv", "--dry-run"});
     EXPECT_EQ(listing(), before);
-    for (const char* part : {"testgen", "64x64", "0:00:01.000 to 0:00:03.000", "50 frames", "819200 bytes",
+    for (const char* part : {"testgen", "64x64", "0:00:01.000 to 0:00:03.000", "50 frames", "307200 bytes",
                              "88200 samples", "'x.yuv'", "rawmux"})
         EXPECT_THAT(o.out, HasSubstr(part));
     fails(4, {"transcode", "in.wav", "-o", "in.wav", "--dry-run"}, {"also an input"});

@@ -24,6 +24,48 @@ TEST_F(Examples, CopySound) {
     EXPECT_EQ(runProgram({program, "absent.wav", "x.wav"}, here()).status, 1);
 }
 
+// A raw clip, a filter, progress, cancelling and causes, as docs/embedding.md shows.
+TEST_F(Examples, Watermark) {
+    const std::string program = QV_BINARY_DIR "/examples/watermark";
+    makeYuv("clip.yuv", 20);
+    works({"frame", "testgen:size=32x32", "-o", "mark.png"});
+    const auto run = [&](const Words& arguments) { return runProgram(Words{program} + arguments, here()); };
+    const Outcome done = run({"clip.yuv", "64x48", "mark.png", "out.avi"});
+    EXPECT_EQ(done.status, 0) << done.err;
+    EXPECT_THAT(done.err, HasSubstr("50 %"));
+    EXPECT_THAT(tarsel({"transcode", "clip.yuv", "--raw", "size=64x48", "--logo", "mark.png@-10,10,0.8", "-o",
+                        "tool.avi", "-q"})
+                    .err,
+                "");
+    EXPECT_TRUE(contents("out.avi") == contents("tool.avi"));
+    const Outcome part = run({"clip.yuv", "64x48", "mark.png", "part.avi", "0.3"});
+    EXPECT_THAT(part.err, testing::AllOf(HasSubstr("cancelled"), testing::Not(HasSubstr("50 %"))));
+    EXPECT_LT(size("part.avi"), size("out.avi"));
+    const struct {
+        Words arguments;
+        const char* cause;
+    } rows[] = {
+        {{"clip.yuv", "64x48", "absent.png", "x.avi"},
+         "Can not open transcode link: logo: The logo picture absent.png can't be opened"},
+        {{"clip.yuv", "64x48", "clip.yuv", "x.avi"}, "can't be read as a PNG"},
+        {{"absent.yuv", "64x48", "mark.png", "x.avi"}, "Failed to open file 'absent.yuv' using 'rawdec'."},
+        {{"clip.yuv", "0x48", "mark.png", "x.avi"}, "Invalid frame size 0x"},
+        {{"clip.yuv", "64x48", "mark.png", "absent/x.avi"}, "absent/x.avi"},
+    };
+    for (const auto& row : rows) {
+        const Outcome o = run(row.arguments);
+        EXPECT_EQ(o.status, 1);
+        EXPECT_THAT(o.err, HasSubstr(row.cause));
+    }
+}
+
+// What documents take from the tool and from examples is what these say now.
+TEST_F(Examples, DocumentsAreCurrent) {
+    const Outcome o =
+        runProgram({"python3", std::string(kSources) + "/tests/lint/tables.py", program()}, here());
+    EXPECT_EQ(o.status, 0) << o.out << o.err;
+}
+
 // The example of how to add a module, through the tool: its decoder opens what nothing else does.
 TEST_F(Examples, PluginThroughTheTool) {
     fs::create_directory(folder.file("plugins"));
@@ -98,6 +140,8 @@ TEST_F(Installed, ByPackageAndByPkgConfig) {
     const Outcome byPackage = runProgram({folder.file("by_package/consumer")}, here());
     EXPECT_EQ(byPackage.status, 0) << byPackage.err;
     EXPECT_THAT(byPackage.out, testing::MatchesRegex("2\\.[0-9.]+ 44\n"));
+    EXPECT_THAT(TempFolder::read(folder.file("tree/share/doc/qvplugcore/modules.md")),
+                HasSubstr("`animatedlogo`"));
     makeWav("take.wav", 777);
     EXPECT_EQ(runProgram({folder.file("by_package/embedding")}, here()).status, 0);
     EXPECT_TRUE(wavPart(contents("take.wav"), "data") == wavPart(contents("copy.wav"), "data"));

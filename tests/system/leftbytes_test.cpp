@@ -10,13 +10,13 @@ const Words kFormats = {"GRAY", "I420", "YV12", "I422", "W016", "YUY2", "YUYV", 
                         "v210", "BGR3", "BGR4", "BGRA", "ARGB", "R32C", "b64a", "R555", "R565"};
 
 Words raw(const std::string& size, const std::string& pixel) {
-    return {"in.yuv", "--raw", "size=" + size + ",pixel=" + pixel + ",rate=25",
+    return {"in.raw", "--raw", "size=" + size + ",pixel=" + pixel + ",rate=25",
             "--to",   "3f",    "--accept-partial"};
 }
 
 struct Memory : Tool {
     void SetUp() override {
-        makeYuv("in.yuv", 40);
+        makeYuv("in.raw", 40);
         for (const unsigned bits : {8u, 16u, 24u}) makeWav(std::to_string(bits) + ".wav", 5001, 3, bits);
         folder.write("s.srt", "1\n00:00:00,000 --> 00:00:01,000\nW\xC3\xA4rter <i>und</i> mehr\n");
     }

@@ -88,7 +88,7 @@ TEST_F(Streams, ARedirectedFileIsWrittenWhereItStands) {
 }
 
 TEST_F(Streams, TheStandardOutputIsForDataOnly) {
-    const Outcome o = works({"transcode", kCard, "-o", "-", "--format", "yuv", "--progress", "json", "--post",
+    const Outcome o = works({"transcode", kCard, "-o", "-", "--format", "raw", "--progress", "json", "--post",
                              "echo said by the command"});
     EXPECT_EQ(o.out.size(), kFrames);
     EXPECT_THAT(o.err, testing::HasSubstr("said by the command"));

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cerrno>
 #include <cstdio>
+#include <cstdlib>
 #include <cstring>
 #include <set>
 
@@ -21,6 +22,8 @@ namespace {
 
 // Of the files in the hidden folder; whatever the final name holds, the engine handles this one.
 const std::string kBase = "out";
+// What can follow it.
+constexpr const char* kNameLetters = "#.0123456789abcdefghijklmnopqrstuvwxyz";
 
 fs::path folderOf(const fs::path& name) {
     return name.has_parent_path() ? name.parent_path() : fs::path(".");
@@ -142,7 +145,18 @@ void Outputs::checkFinal(const fs::path& name) const {
     if (!device_ && fs::is_directory(name, error)) refuse(name, "a folder of this name is in the way");
 }
 
+void Outputs::number(const NumberedName& name) {
+    numbered_ = name;
+    expectSet();
+}
+
 void Outputs::checkNumbered(const std::string& extension) const {
+    if (numbered_) {
+        for (const auto& entry : fs::directory_iterator(folderOf(output_)))
+            if (const std::string name = entry.path().filename().string(); numbered_->matches(name))
+                checkFinal(sibling(output_, name));
+        return;
+    }
     const std::string stem = output_.stem().string() + "#";
     for (const auto& entry : fs::directory_iterator(folderOf(output_))) {
         const std::string name = entry.path().filename().string();
@@ -155,6 +169,14 @@ void Outputs::checkNumbered(const std::string& extension) const {
 
 std::string Outputs::withFinalNames(std::string text) const {
     const std::string hidden = (fs::path(work_.path()) / kBase).string();
+    if (numbered_ && !work_.path().empty()) {
+        for (size_t at = 0; (at = text.find(hidden, at)) != std::string::npos; ++at) {
+            const size_t end =
+                std::min(text.find_first_not_of(kNameLetters, at + hidden.size()), text.size());
+            text.replace(at, end - at, finalName(text.substr(at, end - at), extension_));
+        }
+        return text;
+    }
     const std::string shown = (output_.parent_path() / output_.stem()).string();
     for (size_t at = 0; !work_.path().empty() && (at = text.find(hidden, at)) != std::string::npos;
          at += shown.size())
@@ -167,6 +189,7 @@ std::string Outputs::hiddenName(const std::string& extension) const {
 }
 
 std::string Outputs::begin(const std::string& extension) {
+    extension_ = extension;
     // What is written to a device or a pipe goes straight there, by a link in a folder elsewhere.
     const fs::path where = device_ ? fs::temp_directory_path() : folderOf(set_ ? output_ : target_);
     // Nothing of a user's lies there, so there is nothing to say of it.
@@ -186,8 +209,19 @@ std::string Outputs::begin(const std::string& extension) {
     return name.string();
 }
 
+// `rest`: what the engine put after the base, as "#0007.png", "#01.wav" or ".wav".
+std::string Outputs::numberedName(const std::string& rest, const std::string& from) const {
+    const std::string own = "." + from;
+    const std::string extension = rest.substr(std::min(rest.rfind('.'), rest.size()));
+    const bool pictures = from == "png";
+    if (pictures && extension != own) return numbered_->plain(rest);
+    const long long number = rest[0] == '#' ? std::atoll(rest.c_str() + 1) : 0;
+    return numbered_->at(number, extension == own ? "" : extension);
+}
+
 std::string Outputs::finalName(const fs::path& written, const std::string& from) const {
     const std::string rest = written.filename().string().substr(kBase.size());
+    if (numbered_ && !rest.empty()) return sibling(output_, numberedName(rest, from)).string();
     // What was begun without an extension keeps the whole name.
     fs::path name = rest.empty() ? output_.filename() : output_.stem();
     name += rest == "." + from ? output_.extension().string() : rest;
@@ -213,9 +247,43 @@ bool Outputs::mayGo(const fs::path& name) const {
                         [&](const auto& input) { return sameFile(input, name); });
 }
 
+// The same for numbered names: all that have a number of this form, and next to pictures their sound.
+std::vector<std::string> Outputs::formerNumbers(const std::vector<Manifest::Row>& fresh) const {
+    std::set<std::string> names, extensions = {""};
+    for (const auto& row : fresh) {
+        if (entryExists(work_.place(), row.name.c_str())) names.insert(row.name);
+        const std::string extension = fs::path(row.name).extension().string();
+        if (numbered_->matches(row.name, extension)) extensions.insert(extension);
+    }
+    std::vector<std::string> all;
+    if (const int error = listFolder(work_.place(), all))
+        throw failure(Msg::outputNotPlaced, {output_.string(), std::strerror(error)});
+    bool hadPictures = false;
+    std::vector<std::string> sound;
+    const std::string stem = numbered_->plain("");
+    const auto isSound = [&](const std::string& name) {
+        const std::string shape = name.rfind(stem, 0) == 0 ? shapeOf(name.substr(stem.size())) : "";
+        return shape == ".wav" || shape == "##.wav";
+    };
+    const auto isOurs = [&](const std::string& name) {
+        return std::any_of(extensions.begin(), extensions.end(),
+                           [&](const auto& extension) { return numbered_->matches(name, extension); });
+    };
+    for (const auto& name : all) {
+        if (!mayGo(sibling(output_, name))) continue;
+        if (isSound(name)) sound.push_back(name);
+        if (!isOurs(name)) continue;
+        names.insert(name);
+        hadPictures = hadPictures || extension_ == "png";
+    }
+    if (hadPictures) names.insert(sound.begin(), sound.end());
+    return {names.begin(), names.end()};
+}
+
 // What an earlier run of the same output has left: files whose names differ in nothing but their numbers,
 // and next to numbered pictures their sound.
 std::vector<std::string> Outputs::formerSet(const std::vector<Manifest::Row>& fresh) const {
+    if (numbered_) return formerNumbers(fresh);
     const std::string stem = output_.stem().string();
     const auto ending = [&](const std::string& name) { return shapeOf(name.substr(stem.size())); };
     const auto isPicture = [](const std::string& shape) { return shape.ends_with("##.png"); };

@@ -6,12 +6,14 @@
 #include <atomic>
 #include <filesystem>
 #include <mutex>
+#include <optional>
 #include <string>
 #include <vector>
 
 #include "tarsel/host/outputs/manifest.h"
 #include "tarsel/host/outputs/placement.h"
 #include "tarsel/host/outputs/workfolder.h"
+#include "tarsel/words/numberedname.h"
 
 // How results may be written.
 struct OutputPolicy {
@@ -41,6 +43,9 @@ class Outputs {
     void checkFinal(const std::filesystem::path& name) const;
     // Refuses existing files of the same numbered name, "card#0007.png" for "card.png".
     void checkNumbered(const std::string& extension) const;
+    // That the files are named after numbers ("pic_%04d.png"); what is numbered counts from 0. `name` is that
+    // of `output`. Before all that follows.
+    void number(const NumberedName& name);
     // That the job writes other files than `output`, or more. Of one file a symbolic link is followed; in a
     // set each name gets a file, and what a link led to is unchanged. Before begin.
     void expectSet() { set_ = true; }
@@ -78,6 +83,8 @@ class Outputs {
   private:
     void putInOrder(const std::filesystem::path& folder) const;
     Manifest plan(const std::vector<std::filesystem::path>& files, const std::string& from) const;
+    std::string numberedName(const std::string& rest, const std::string& from) const;
+    std::vector<std::string> formerNumbers(const std::vector<Manifest::Row>& fresh) const;
     std::vector<std::string> formerSet(const std::vector<Manifest::Row>& fresh) const;
     bool mayGo(const std::filesystem::path& name) const;
     void place(const Manifest& set);
@@ -85,6 +92,8 @@ class Outputs {
 
     std::filesystem::path output_;
     std::filesystem::path target_;  // where a link leads to that `output_` is; otherwise `output_`
+    std::optional<NumberedName> numbered_;
+    std::string extension_;  // of the engine's first file
     std::vector<std::string> inputs_;
     OutputPolicy policy_;
     bool device_, set_ = false;

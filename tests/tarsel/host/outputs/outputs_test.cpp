@@ -65,6 +65,24 @@ const Job kJobs[] = {
      {{"a.wav", "b"}},
      {{"out#0.png", "n"}},
      {{"a.wav", "b"}, {"a#0.png", "n"}}},
+    {"a shorter sequence with numbers of its own",
+     "p_%03d.png",
+     "png",
+     {{"p_000.png", "0"},
+      {"p_001.png", "1"},
+      {"p_1000.png", "k"},
+      {"p.wav", "s"},
+      {"p#00.wav", "c"},
+      {"p_1.png", "b"},
+      {"p.png", "b"}},
+     {{"out#0.png", "n0"}},
+     {{"p_000.png", "n0"}, {"p_1.png", "b"}, {"p.png", "b"}}},
+    {"numbered streams",
+     "c%d.yuv",
+     "raw",
+     {{"c0.yuv", "0"}, {"c2.yuv", "2"}, {"c2.wav", "2"}, {"c2.png", "b"}, {"cx.yuv", "b"}},
+     {{"out#00.raw", "n0"}, {"out#01.raw", "n1"}, {"out.wav", "s"}},
+     {{"c0.yuv", "n0"}, {"c1.yuv", "n1"}, {"c0.wav", "s"}, {"c2.png", "b"}, {"cx.yuv", "b"}}},
     {"fewer channels",
      "a.wav",
      "wav",
@@ -109,9 +127,10 @@ class OutputsTest : public testing::Test {
         try {
             Outputs outputs(job.output, "-o", {}, policy());
             if (job.written.size() > 1) outputs.expectSet();
+            if (const auto numbered = NumberedName::parse(job.output)) outputs.number(*numbered);
             const fs::path work = fs::path(outputs.begin(job.extension)).parent_path();
             for (const auto& [name, bytes] : job.written) std::ofstream(work / name) << bytes;
-            outputs.commit("raw");
+            outputs.commit(job.extension);
             return 0;
         } catch (const Failure& failure) {
             return static_cast<int>(failure.exit());
