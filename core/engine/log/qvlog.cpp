@@ -1,5 +1,6 @@
 #include "core/engine/log/qvlog.h"
 
+#include <cerrno>
 #include <mutex>
 #include <new>
 #include <string>
@@ -108,6 +109,7 @@ int QvDbgLog::init(const Any* logfile, QvLogBase* logger) {
     if (target == target_) return QvStatus::ok;
     closeStream();
     debugger_ = false;
+    writeError_ = 0;
     target_.invalidate();
     const int result = openTarget(target);
     target_ = target;
@@ -157,8 +159,9 @@ void QvDbgLog::logs(int mask, const char* text) {
     const Line line(text);
     Lock lock(section());
     if (std::FILE* stream = stream_) {
-        std::fprintf(stream, "%s %s\n", tagOf(mask), line.text());
-        std::fflush(stream);
+        const bool taken =
+            std::fprintf(stream, "%s %s\n", tagOf(mask), line.text()) >= 0 && std::fflush(stream) == 0;
+        if (!taken && writeError_ == 0) writeError_ = errno;
     }
     try {
         if (QvLogBase* receiver = logger()) callLogger(*receiver, mask, line.text());

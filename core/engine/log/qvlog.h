@@ -49,6 +49,8 @@ class QV_API QvDbgLog {
     QvLogBase* logger() const;
     // False: whatever is logged vanishes, so a caller can spare itself the text.
     bool hasTarget() const;
+    // The errno of the first line that the present stream did not take; 0 when it has taken all.
+    int writeError() const { return writeError_.load(); }
 
     // Writes `text` as one line after the time, "h:mm:ss.mmm"; time and text have at most 2,047 characters.
     void logs(int mask, const char* text);
@@ -78,6 +80,7 @@ class QV_API QvDbgLog {
     std::atomic<QvLogBase*> logger_{nullptr};
     Any target_;
     std::atomic<bool> debugger_{false};
+    std::atomic<int> writeError_{0};
 
     friend struct QvDbgLogCloser;
 };
