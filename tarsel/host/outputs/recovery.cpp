@@ -130,10 +130,26 @@ class Visit {
         }
         WorkFolder work(Descriptor(dup(place_)), found_.folder, std::move(folder_), std::move(owner_));
         const WorkFolder::Removed removed = work.remove();
-        if (entryExists(place_, found_.folder.c_str())) return as(Outcome::failed, "it can't be removed");
+        if (entryExists(place_, found_.folder.c_str())) return as(Outcome::failed, whatStays());
         found_.files = restore || complete ? moved : removed.files;
         found_.bytes = removed.bytes;
         return as(restore ? Outcome::restored : complete ? Outcome::completed : Outcome::removed);
+    }
+
+    // What a work folder still has that no run puts there.
+    std::string whatStays() const {
+        const Descriptor folder(
+            openat(place_, found_.folder.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
+        std::vector<std::string> names;
+        if (!folder || listFolder(folder.get(), names) != 0) return "it can't be removed";
+        for (const auto& name : names) {
+            struct stat status;
+            if (name == WorkFolder::kOwner ||
+                fstatat(folder.get(), name.c_str(), &status, AT_SYMLINK_NOFOLLOW))
+                continue;
+            return (S_ISDIR(status.st_mode) ? "the folder " : "the file ") + inQuotes(name) + " is in it";
+        }
+        return "it can't be removed";
     }
 
     int place_;

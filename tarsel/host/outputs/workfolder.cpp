@@ -39,6 +39,20 @@ int removeOnce(int folder, WorkFolder::Removed& removed) {
     return count;
 }
 
+// Whether anything but the owner is in a folder.
+bool holdsMore(int folder) {
+    alignas(dirent64) char entries[4096];
+    lseek(folder, 0, SEEK_SET);
+    for (ssize_t size; (size = getdents64(folder, entries, sizeof entries)) > 0;)
+        for (ssize_t at = 0; at < size;) {
+            const auto* entry = reinterpret_cast<const dirent64*>(entries + at);
+            at += entry->d_reclen;
+            const std::string_view name = entry->d_name;
+            if (name != "." && name != ".." && name != WorkFolder::kOwner) return true;
+        }
+    return false;
+}
+
 }  // namespace
 
 // False if a run that cleans the place has taken the folder for one that was left: it is empty until its
@@ -90,6 +104,12 @@ WorkFolder::Removed WorkFolder::remove() {
     unlinkat(folder_.get(), Manifest::kMovingNewOut, 0);
     // What is removed while a folder is listed may hide other entries.
     while (removeOnce(folder_.get(), removed) > 0) {
+    }
+    // What can't be removed, such as a folder that somebody has put there, stays with its owner's name: the
+    // next run tries again.
+    if (holdsMore(folder_.get())) {
+        leave();
+        return removed;
     }
     unlinkat(folder_.get(), kOwner, 0);
     unlinkat(place_.get(), name_.c_str(), AT_REMOVEDIR);

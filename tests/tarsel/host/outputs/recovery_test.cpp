@@ -163,6 +163,19 @@ TEST_F(Recovery, WhatIsNotOursStays) {
     EXPECT_EQ(TempFolder::read(other.file("kept")), "kept");
 }
 
+// It is named, and tried again.
+TEST_F(Recovery, AFolderOfAnother) {
+    leave(ended().text());
+    fs::create_directory(work() / "theirs");
+    for (int i = 0; i < 2; ++i) {
+        EXPECT_EQ(outcome(), Outcome::failed);
+        EXPECT_EQ(recover().at(0).detail, "the folder 'theirs' is in it");
+        EXPECT_FALSE(fs::exists(work() / "out.wav"));
+    }
+    fs::remove(work() / "theirs");
+    EXPECT_EQ(outcome(), Outcome::removed);
+}
+
 // Each is refused as a whole: nothing moves, nothing is removed.
 TEST_F(Recovery, AManifestThatIsNotRight) {
     const auto sealed = [](const std::string& rows) {
