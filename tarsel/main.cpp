@@ -12,7 +12,7 @@
 #include "tarsel/host/console.h"
 #include "tarsel/host/files.h"
 #include "tarsel/host/memory.h"
-#include "tarsel/host/outputs/outputs.h"
+#include "tarsel/host/outputs/transaction.h"
 #include "tarsel/host/plugins.h"
 #include "tarsel/host/signals.h"
 #include "tarsel/host/terminal.h"
@@ -24,7 +24,7 @@ namespace {
 // The engine, from the first command to the end of the program.
 class Engine {
   public:
-    Engine(const std::string& log, const std::string& plugins, bool allowUnsafe) {
+    Engine(const std::string& log, const std::string& plugins, bool allowUnsafe) : log_(log) {
         AnyDict config;
         if (!log.empty() && log != "stderr") requireLog(log);
         if (!log.empty()) config.set("logfile", log.c_str());
@@ -36,6 +36,7 @@ class Engine {
         qvPresetMgr()->update();
     }
     ~Engine() {
+        tellOfLog();
         // The engine traces the unloading of plug-ins on the standard error, past any log; a user would take
         // it for talk.
         const QuietStderr quiet(pluginsLoaded_);
@@ -47,6 +48,18 @@ class Engine {
     }
 
   private:
+    // The job has its result whether or not the log has it all.
+    void tellOfLog() const {
+        const int error = qv_dbg()->writeError();
+        if (error == 0 || log_.empty() || log_ == "stderr") return;
+        try {
+            const Failure why = systemFailure(Msg::logNotWritten, log_, error);
+            std::fprintf(stderr, "tarsel: warning: %s\n", why.what());
+        } catch (const std::bad_alloc&) {
+        }
+    }
+
+    std::string log_;
     bool pluginsLoaded_ = false;
 };
 
@@ -68,7 +81,7 @@ int run(int argc, char** argv) {
     line.flag("--allow-unsafe-plugins", allowUnsafePlugins, "Load plug-ins that other users may change, too");
     addTranscode(line, signals);
     addInfo(line);
-    addCaptions(line);
+    addCaptions(line, signals);
     addFrame(line, signals);
     addModules(line);
     addFormats(line);
@@ -91,7 +104,7 @@ int run(int argc, char** argv) {
     blameLoadingPlugin("an exception left its start");
     // The result has its name; what could not be put away changes nothing.
     if (Signals::isComplete()) leave(status(Exit::done));
-    const bool abandoned = Outputs::abandonAll();
+    const bool abandoned = Transaction::abandonAll();
     const char* reason = MemoryWatch(0).ranOut() ? "tarsel: out of memory" : "tarsel: an internal error";
     try {
         if (std::current_exception()) throw;

@@ -10,6 +10,7 @@
 #include "tarsel/host/console.h"
 #include "tarsel/host/files.h"
 #include "tarsel/host/outputs/outputs.h"
+#include "tarsel/host/outputs/streamoutput.h"
 #include "tarsel/source/captionfile.h"
 #include "tarsel/source/source.h"
 #include "tarsel/words/messages.h"
@@ -117,11 +118,13 @@ std::string sccText(const Captions& captions) {
     return data.sccText(captions.rate, {.dropFrameLines = true, .complete = true});
 }
 
-void save(const std::string& text, Outputs& outputs, const std::string& shown, const char* extension) {
+void save(const std::string& text, Outputs& outputs, const std::string& extension, Signals& signals) {
+    const Signals::Watch watch(signals, {.first = {}, .second = [&] { return outputs.leave(); }});
     const std::string name = outputs.begin(extension);
-    if (const int error = writeFile(name, text)) throw systemFailure(Msg::outputSystem, shown, error);
-    outputs.commit(extension);
-    std::fprintf(stderr, "tarsel: wrote %s\n", inQuotes(shown).c_str());
+    if (const int error = writeFile(name, text))
+        throw systemFailure(Msg::outputSystem, outputs.output().string(), error);
+    outputs.commit();
+    signals.complete();
 }
 
 }  // namespace
@@ -153,9 +156,14 @@ std::string CaptionExport::text() const {
     return scc ? sccText(captions) : jsonText(captions);
 }
 
-void CaptionExport::run() const {
+void CaptionExport::run(Signals& signals) const {
     const std::string form = only();
     if (output.empty() || output == "-") return printText(text());
-    Outputs file(output, "-o", files, outputs.policy());
-    save(text(), file, output, form.c_str());
+    if (const auto stream = StreamOutput::find(output, files)) {
+        if (const int error = stream->write(text())) throw systemFailure(Msg::outputSystem, output, error);
+    } else {
+        Outputs file(output, "-o", files, outputs.policy());
+        save(text(), file, form, signals);
+    }
+    std::fprintf(stderr, "tarsel: wrote %s\n", inQuotes(output).c_str());
 }

@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "tarsel/commands/outputoptions.h"
+#include "tarsel/host/signals.h"
 
 struct CaptionExport {
     std::vector<std::string> files;  // one subtitle file, or SCC files of field 1 and field 2
@@ -15,7 +16,7 @@ struct CaptionExport {
 
     bool wanted() const { return srt || vtt || scc || json; }
     // Throws Failure.
-    void run() const;
+    void run(Signals& signals) const;
 
   private:
     std::string text() const;

@@ -77,7 +77,7 @@ void showCaptions(const std::vector<std::string>& files) {
 
 }  // namespace
 
-void addCaptions(CommandLine& line) {
+void addCaptions(CommandLine& line, Signals& signals) {
     Command command = line.command(
         "captions",
         "Show the captions of an SCC file: time, field, bytes, text; or write them in another form");
@@ -90,5 +90,5 @@ void addCaptions(CommandLine& line) {
     command.option("--rate", given->rate, "Frame rate of the timecodes", "R");
     command.option("-o,--output", given->output, "What to write, in place of the standard output", "FILE");
     given->outputs.add(command);
-    command.action([given] { given->wanted() ? given->run() : showCaptions(given->files); });
+    command.action([&signals, given] { given->wanted() ? given->run(signals) : showCaptions(given->files); });
 }

@@ -6,7 +6,7 @@ class Signals;
 
 void addTranscode(CommandLine& line, Signals& signals);
 void addInfo(CommandLine& line);
-void addCaptions(CommandLine& line);
+void addCaptions(CommandLine& line, Signals& signals);
 void addModules(CommandLine& line);
 void addFormats(CommandLine& line);
 void addPresets(CommandLine& line);

@@ -61,12 +61,8 @@ class Shrinker {
 
 void save(const QvFrame& picture, const Given& given) {
     Outputs* const outputs = given.outputs.get();
-    const auto leave = [outputs] {
-        outputs->discard();
-        return outputs->placed();
-    };
     Signals::Handlers handlers;
-    if (outputs) handlers.second = leave;
+    if (outputs) handlers.second = [outputs] { return outputs->leave(); };
     const Signals::Watch watch(*given.signals, std::move(handlers));
     const std::string name = outputs ? outputs->begin("png") : given.stream->engineName();
     if (picture.four_cc() != QvFourcc::BGR3) makeAnyCodec("scaler", kVideoFilter);  // says that it is missing
@@ -75,7 +71,7 @@ void save(const QvFrame& picture, const Given& given) {
         if (errno != 0) throw systemFailure(Msg::outputSystem, given.output, errno);
         throw failure(Msg::outputRefused, {given.output, "the picture can't be converted to a PNG"});
     }
-    if (outputs) outputs->commit("png");
+    if (outputs) outputs->commit();
     given.signals->complete();
     printWarnings();
     std::fprintf(stderr, "tarsel: wrote %s\n", inQuotes(given.output).c_str());
@@ -102,6 +98,15 @@ void saveSheet(PictureReader& reader, const Given& given) {
     save(sheet, given);
 }
 
+// A cut input is refused unless the user takes what is there, as a run would do it.
+void checkDamage(const Source& source, bool acceptPartial) {
+    const std::string damage = source.damage();
+    if (damage.empty()) return;
+    if (!acceptPartial) throw failure(Msg::inputDamaged, {source.name(), damage});
+    std::fprintf(stderr, "tarsel: warning: %s\n",
+                 lineOf(Msg::inputDamagedTaken, {source.name(), damage}).c_str());
+}
+
 void frame(Given& given) {
     given.effects.check();
     if (!given.sheet.empty()) parseSheet(given.sheet);
@@ -112,12 +117,12 @@ void frame(Given& given) {
     if (!given.stream && NumberedName::parse(fs::path(given.output).filename().string()))
         throw failure(Msg::pictureNumbered, {given.output});
     Source source(given.input, given.raw);
-    if (!given.stream)
-        given.outputs = std::make_shared<Outputs>(given.output, "-o", std::vector{given.input}, policy);
+    if (!given.stream) given.outputs = std::make_shared<Outputs>(given.output, "-o", source.files(), policy);
     if (source.decoder().nrStreams(1) == 0) throw failure(Msg::fileNoPicture, {given.input});
     source.selectAll();
+    checkDamage(source, given.effects.acceptPartial);
     PictureReader reader(source, given.effects);
-    if (reader.pipe()) checkFilterFiles(*reader.pipe(), {given.input}, given.outputs.get(), policy);
+    if (reader.pipe() && given.outputs) given.outputs->addInputs(filterFiles(*reader.pipe()).read);
     if (!given.sheet.empty()) return saveSheet(reader, given);
     const auto rate = source.frameRate();
     const MediaTime at = given.at.empty() ? MediaTime(0LL, kTicks) : parseTime(given.at, rate, "--at");
@@ -141,7 +146,7 @@ void addFrame(CommandLine& line, Signals& signals) {
                    Need::required);
     addEffectOptions(command, given->effects);
     command.flag("--accept-partial", given->effects.acceptPartial,
-                 "Take what can be read of damaged subtitles");
+                 "Take what is there of a damaged input or of damaged subtitles");
     given->outputOptions.add(command);
     command.action([given] { frame(*given); });
 }

@@ -1,5 +1,3 @@
-#include <utility>
-
 #include "tarsel/commands/commands.h"
 #include "tarsel/commands/outputoptions.h"
 #include "tarsel/host/signals.h"
@@ -42,16 +40,15 @@ void resolve(Given& given) {
 
 void transcode(Given& given, Signals& signals) {
     resolve(given);
-    bool saved = given.job.saveTask.empty();
     for (int attempt = 1;; ++attempt) {
         Job job(given.job, signals);
-        if (!std::exchange(saved, true)) job.saveTask();
-        if (given.job.dryRun) return job.printPlan();
+        if (given.job.dryRun) return job.plan();
         try {
             return job.run();
         } catch (const InputShrank& shrank) {
             if (!given.job.acceptPartial || attempt == kMostAttempts) throw;
             given.job.warnings.push_back(shrank.warning);
+            if (job.taskIsStream()) given.job.saveTask.clear();
         }
     }
 }

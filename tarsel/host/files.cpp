@@ -45,10 +45,8 @@ void requireLog(const std::string& name) {
 Failure failureOf(const std::system_error& error) {
     const SystemCause cause = causeOf(error.code().value());
     const auto* failed = dynamic_cast<const fs::filesystem_error*>(&error);
-    if (!failed) return failure(Msg::systemFailed, {cause.why, cause.remedy});
-    const std::string path = failed->path1().string();
-    // Only the search for a temporary folder names none.
-    if (path.empty()) return failure(Msg::temporaryFolder, {cause.why});
+    const std::string path = failed ? failed->path1().string() : "";
+    if (path.empty()) return failure(Msg::systemFailed, {cause.why, cause.remedy});
     return failure(Msg::pathFailed, {path.substr(0, path.find("/.tarsel-")), cause.why, cause.remedy});
 }
 

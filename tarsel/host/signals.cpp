@@ -1,6 +1,8 @@
 #include "tarsel/host/signals.h"
 
+#include <algorithm>
 #include <atomic>
+#include <cstdio>
 #include <mutex>
 #include <system_error>
 
@@ -33,6 +35,28 @@ Exit statusOf(int signal) {
     return signal == SIGTERM ? Exit::terminated : signal == SIGHUP ? Exit::hangup : Exit::interrupted;
 }
 
+// Of an exception there is nobody to tell, and the thread has to stay.
+template <class Handler>
+bool succeeds(Handler handler) {
+    try {
+        handler();
+        return true;
+    } catch (...) {
+        return false;
+    }
+}
+
+// In one write, so that nothing stands in between.
+void tell(const Signals::Handlers& handlers) {
+    const char* text = !handlers.last.empty() ? handlers.last.c_str()
+                       : handlers.second      ? "stopped; nothing was left behind"
+                                              : "stopped";
+    char line[4096];
+    const int length = std::snprintf(line, sizeof line, "tarsel: %s\n", text);
+    const auto shown = std::min(static_cast<size_t>(std::max(length, 0)), sizeof line - 1);
+    if (stderrHasRoom()) writeToStderr({line, shown});
+}
+
 }  // namespace
 
 // Runs for the life of the process, so it is detached: a signal may come until the very end.
@@ -44,7 +68,7 @@ void Signals::wait() {
         if (signal != SIGUSR1)
             stop(signal);
         else if (g_innermost && g_innermost->handlers_.report)
-            g_innermost->handlers_.report();
+            succeeds([] { g_innermost->handlers_.report(); });
     }
 }
 
@@ -53,10 +77,10 @@ void Signals::stop(int signal) {
     const Handlers none;
     const Handlers& now = g_innermost ? g_innermost->handlers_ : none;
     if (g_complete && !again) return;
-    if (!again && now.first) return now.first(signal);
-    const bool complete = g_complete || (now.second && now.second());
-    if (!again && !complete)
-        writeToStderr(now.second ? "tarsel: stopped; nothing was left behind\n" : "tarsel: stopped\n");
+    if (!again && now.first && succeeds([&] { now.first(signal); })) return;
+    bool complete = g_complete;
+    if (!complete && now.second) succeeds([&] { complete = now.second(); });
+    if (!complete) tell(now);
     _exit(static_cast<int>(complete ? Exit::done : statusOf(signal)));
 }
 

@@ -3,19 +3,23 @@
 #pragma once
 
 #include <functional>
+#include <string>
 #include <thread>
 
 #include "tarsel/words/failure.h"
 
 class Signals {
   public:
-    // What a part of a command does; each may be empty.
+    // What a part of a command does; each may be empty. What one throws is lost.
     struct Handlers {
         std::function<void(int)> first;  // on the first signal that stops, with its number
         // On the next one, or on the first if `first` is empty. The process then ends at once: with status 0
         // if this answers that the work was complete, else with that of the signal.
         std::function<bool()> second;
-        std::function<void()> report;  // on SIGUSR1, as often as it comes
+        std::function<void()> report = {};  // on SIGUSR1, as often as it comes
+        // What is said when the process ends at once before the work is complete; "": that nothing was left
+        // behind, if there is a `second` to see to that.
+        std::string last = {};
     };
 
     // Blocks those of them that are not ignored in this thread and those started from now on. Make it before

@@ -3,6 +3,7 @@
 #include <cstdlib>
 
 #include <fcntl.h>
+#include <poll.h>
 #include <sys/ioctl.h>
 #include <unistd.h>
 
@@ -16,6 +17,11 @@ bool colourWanted() {
 int terminalColumns() {
     winsize size{};
     return ioctl(STDERR_FILENO, TIOCGWINSZ, &size) == 0 ? size.ws_col : 0;
+}
+
+bool stderrHasRoom() {
+    pollfd room{STDERR_FILENO, POLLOUT, 0};
+    return poll(&room, 1, 0) == 1 && (room.revents & POLLOUT) != 0;
 }
 
 bool writeToStderr(std::string_view text) { return write(STDERR_FILENO, text.data(), text.size()) >= 0; }

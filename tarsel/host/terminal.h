@@ -7,6 +7,8 @@ bool stderrIsTerminal();
 bool colourWanted();    // false if NO_COLOR is set to anything
 int terminalColumns();  // of the standard error; 0 if it has no width
 
+// Whether a write of up to 4096 bytes would not wait. Without memory or locks.
+bool stderrHasRoom();
 // Without memory or locks. False if it could not be written.
 bool writeToStderr(std::string_view text);
 // At once: no destructor and no exit handler runs.

@@ -129,10 +129,8 @@ void Job::chooseOutput() {
     if (takesOneStream()) checkStream();
     if (stream_) return;
     chooseNumbers();
-    outputs_ = std::make_unique<Outputs>(options_.output, "-o", options_.inputs, options_.policy);
+    outputs_ = std::make_unique<Outputs>(options_.output, "-o", options_.inputs, options_.policy, files_);
     if (numbered_) outputs_->number(*numbered_);
-    if (kind_ == OutputKind::pictures) outputs_->checkNumbered("png");
-    if (options_.splitChannels) outputs_->checkNumbered("wav");
 }
 
 void Job::checkStream() const {
@@ -370,21 +368,73 @@ void Job::addStream(JobStream& stream) {
     }
 }
 
-// Names that exist are refused before any work; what is written beside the output counts as well.
-void Job::checkNames() const {
-    if (!outputs_) return;
+// Nothing is written over what the job reads, or twice, and names that exist are refused before any work;
+// what is written beside the output counts as well.
+void Job::checkNames() {
+    for (const auto& source : sources_)
+        filterFiles_.read.insert(filterFiles_.read.end(), source->files().begin(), source->files().end());
+    if (outputs_) checkOutputNames();
+    if (takesOneStream()) claim(stream_->place(), stream_->name());
+    claimFilterFiles();
+    claimTask();
+}
+
+void Job::checkOutputNames() {
+    outputs_->addInputs(filterFiles_.read);
+    long long pictures = 0, channels = 0;
+    for (const JobStream& s : streams_)
+        (s.type == kVideo ? pictures : channels) += s.type == kVideo ? s.expected : s.channels;
+    if (kind_ == OutputKind::pictures) outputs_->checkNumbered("png", pictures);
+    if (options_.splitChannels) outputs_->checkNumbered("wav", channels);
     if (kind_ == OutputKind::pictures || options_.splitChannels ||
         (kind_ != OutputKind::avi && streams_.size() > 1) || numbered_)
         outputs_->expectSet();
     pipe_->setFilename(Any(outputs_->hiddenName(primaryExtension()).c_str()));
     const Any names = pipe_->getMuxer()->QvCodec::getParam("filenames");
-    if (!names.isVector()) return;
-    std::set<std::string> final;
-    for (int i = 0; i < names.asVector().size(); ++i) {
+    for (int i = 0; names.isVector() && i < names.asVector().size(); ++i) {
         const auto name = outputs_->finalName(names.asVector().at(i).asString(), primaryExtension());
         outputs_->checkFinal(name);
-        if (!final.insert(name).second) throw failure(Msg::outputTwice, {name});
+        if (!places_.insert(outputs_->placeOf(name)).second)
+            throw failure(Msg::outputTwice, {name, "give -o the extension of its format"});
     }
+    places_.insert(outputs_->placeOf(outputs_->output()));
+}
+
+// That nothing else of the job goes there.
+void Job::claim(const std::string& place, const std::string& name) {
+    if (outputs_ && place == outputs_->placeOf(outputs_->output()))
+        throw failure(Msg::outputIsOutput, {name});
+    const bool numbered = outputs_ && ((kind_ == OutputKind::pictures && outputs_->numbers(place, "png")) ||
+                                       (options_.splitChannels && outputs_->numbers(place, "wav")));
+    if (numbered || !places_.insert(place).second)
+        throw failure(Msg::outputTwice, {name, "give one of them another name"});
+}
+
+void Job::claimFilterFiles() {
+    for (const auto& [file, filter] : filterFiles_.written) {
+        // Of the null device there is always one more.
+        if (const auto stream = file == "-" ? nullptr : StreamOutput::find(file, filterFiles_.read)) {
+            if (!stream->discards()) claim(stream->place(), file);
+            continue;
+        }
+        auto output =
+            std::make_unique<Outputs>(file, "--filter " + filter, filterFiles_.read, options_.policy, files_);
+        claim(output->placeOf(file), file);
+        dumps_[file] = std::move(output);
+    }
+}
+
+void Job::claimTask() {
+    const std::string& name = options_.saveTask;
+    if (name.empty()) return;
+    taskStream_ = StreamOutput::find(name, filterFiles_.read);
+    if (!taskStream_) {
+        taskFile_ =
+            std::make_unique<Outputs>(name, "--save-task", filterFiles_.read, options_.policy, files_);
+        return claim(taskFile_->placeOf(name), name);
+    }
+    if (taskStream_->isStandardOutput() && options_.dryRun) throw failure(Msg::planAndTask, {name});
+    if (!taskStream_->discards()) claim(taskStream_->place(), name);
 }
 
 // What was asked for has to have something that it works on.
@@ -410,12 +460,16 @@ void Job::planFilters() {
     takeWarnings();
 }
 
-void Job::planPicture(JobStream& stream) const {
+void Job::planPicture(JobStream& stream) {
     if (kind_ == OutputKind::pictures) makeAnyCodec("scaler", kVideoFilter);
     const FiltersState state = stream.picture->filters(stream.expected, false);
     if (!state.empty()) stream.params.setFilters(state);
     const auto pipe = tryPipe(stream.picture->job(state));
-    if (pipe) checkFilterFiles(*pipe, options_.inputs, outputs_.get(), options_.policy);
+    if (pipe) {
+        const FilterFiles files = filterFiles(*pipe);
+        filterFiles_.read.insert(filterFiles_.read.end(), files.read.begin(), files.read.end());
+        filterFiles_.written.insert(filterFiles_.written.end(), files.written.begin(), files.written.end());
+    }
     stream.chain = describe(pipe.get());
 }
 

@@ -2,8 +2,10 @@
 #pragma once
 
 #include <atomic>
+#include <map>
 #include <memory>
 #include <optional>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -69,11 +71,12 @@ class Job {
     Job(const JobOptions& options, Signals& signals);
     ~Job();
 
-    // Prints the plan to the standard output.
-    void printPlan() const;
-    void saveTask();
+    // Writes the task file if there is to be one, and prints the plan to the standard output.
+    void plan();
     // Runs, checks and commits. Throws Failure.
     void run();
+    // Whether the task file is a stream, which takes it once.
+    bool taskIsStream() const { return taskStream_ != nullptr; }
 
   private:
     class Runner;
@@ -91,7 +94,7 @@ class Job {
     void planPoints();
     void planLengths();
     void planFilters();
-    void planPicture(JobStream& stream) const;
+    void planPicture(JobStream& stream);
     void planSound(JobStream& stream) const;
     void checkEffects() const;
     void takeWarnings();
@@ -99,12 +102,18 @@ class Job {
     void checkCounts() const;
     void buildPipe();
     void addStream(JobStream& stream);
-    void checkNames() const;
+    void checkNames();
+    void checkOutputNames();
+    void claim(const std::string& place, const std::string& name);
+    void claimFilterFiles();
+    void claimTask();
+    void printPlan() const;
+    void storeTask();
+    void commit();
     void checkDamage();
     void checkLengths() const;
     void checkSpace() const;
     void redirectFilters();
-    void discard();
     std::string withFinalNames(std::string text) const;
     void link(Runner& runner) const;
     int runLinked(Runner& runner, Progress& progress);
@@ -118,24 +127,26 @@ class Job {
     void checkTaken() const;
     long long taken() const;  // bytes, by a stream
     void report(const std::vector<std::string>& names) const;
-    void runPost(const std::vector<std::string>& names) const;
+    void runPost(const std::vector<std::string>& names, Progress& progress, ProgressState state) const;
     void showWarnings() const;
     std::string primaryExtension() const;
     const std::string& outputName() const;  // for messages
     bool hasVideo() const;
     bool writesNothing() const;
     bool takesOneStream() const;
-    // The engine's words with the names that the user knows.
-
     JobOptions options_;
     Signals& signals_;
     OutputKind kind_ = OutputKind::raw;
     std::vector<std::unique_ptr<Source>> sources_;
     std::vector<JobStream> streams_;
     std::optional<NumberedName> numbered_;
-    std::unique_ptr<Outputs> outputs_, taskFile_;        // no `outputs_` where there is a `stream_`
-    std::vector<std::unique_ptr<Outputs>> filterFiles_;  // what filters write
-    std::unique_ptr<StreamOutput> stream_;
+    // Of all files that the job writes: they get their names together.
+    std::shared_ptr<Transaction> files_ = std::make_shared<Transaction>();
+    std::unique_ptr<Outputs> outputs_, taskFile_;  // no `outputs_` where there is a `stream_`
+    std::unique_ptr<StreamOutput> stream_, taskStream_;
+    FilterFiles filterFiles_;
+    std::map<std::string, std::unique_ptr<Outputs>> dumps_;  // what filters write, by the name that they have
+    std::set<std::string> places_;                           // of all that the job writes
     std::unique_ptr<QvEncodePipe> pipe_;
     std::vector<std::string> warnings_;
     std::vector<long long> lengths_;  // bytes of the inputs at the start; negative for what is no file

@@ -18,6 +18,15 @@ std::string formatOf(const JobStream& s) {
 
 }  // namespace
 
+void Job::plan() {
+    {
+        const Signals::Watch storing(signals_, {.first = {}, .second = [&] { return files_->leave(); }});
+        storeTask();
+        if (taskFile_) taskFile_->commit();
+    }
+    printPlan();
+}
+
 void Job::printPlan() const {
     for (const auto& source : sources_)
         print("input   %s  %s\n", inQuotes(source->name()).c_str(), formatTime(source->duration()).c_str());

@@ -198,22 +198,24 @@ int Job::runLinked(Runner& runner, Progress& progress) {
 }
 
 void Job::run() {
-    checkSpace();
-    redirectFilters();
     Progress progress(options_.quiet ? ProgressMode::off : options_.progress, "task 1 of 1  ");
     std::vector<std::string> names;
     // What has begun to take its place is neither left half-way nor taken back.
-    const auto leave = [&] {
-        discard();
-        return outputs_ && outputs_->placed();
-    };
-    const Signals::Watch placing(signals_, {.first = [](int) {}, .second = leave, .report = {}});
+    const auto leave = [&] { return files_->leave(); };
+    const std::string last =
+        takesOneStream() ? "stopped; " + inQuotes(options_.output) + " may have a part of it" : "";
+    const Signals::Watch placing(signals_, {.first = [](int) {}, .second = leave, .last = last});
+    checkSpace();
+    storeTask();
+    redirectFilters();
+    ProgressState end;
     {
         const MemoryWatch memory;
         Runner runner(*this, progress);
         const Signals::Watch running(signals_, {.first = [&](int) { runner.requestStop(); },
                                                 .second = leave,
-                                                .report = [&] { runner.report(); }});
+                                                .report = [&] { runner.report(); },
+                                                .last = last});
         try {
             link(runner);
             const int result = runLinked(runner, progress);
@@ -221,17 +223,19 @@ void Job::run() {
             if (result != 0 && result != QvStatus::endOfStream) fail(runner, result);
             if (runner.filterFailure()) throw *runner.filterFailure();
         } catch (...) {
-            if (signals_.received() == Exit::done) checkLengths();
+            stopIfSignalled();
+            checkLengths();
             tellBetter(memory.ranOut());
         }
         checkLengths();
         takeWarnings();
         checkResult();
         stopIfSignalled();
-        if (outputs_) names = outputs_->commit(primaryExtension());
-        for (auto& file : filterFiles_) file->commit("");
-        if (stream_) names = {stream_->name()};
+        end = runner.last();
+        commit();
     }
+    if (outputs_) names = outputs_->names();
+    if (stream_) names = {stream_->name()};
     if (options_.post.empty()) signals_.complete();
     // The result is there, whether or not there is memory to say so.
     try {
@@ -240,7 +244,7 @@ void Job::run() {
     } catch (const std::bad_alloc&) {
         writeToStderr("tarsel: done; there was no memory to say more\n");
     }
-    if (!options_.post.empty()) runPost(names);
+    if (!options_.post.empty()) runPost(names, progress, end);
     signals_.complete();
 }
 
@@ -270,20 +274,20 @@ void Job::redirectFilters() {
         const Any& filters = stream.params.get("filters");
         if (stream.type != 1 || !filters.isDict()) continue;
         FiltersState state(filters.asDict());
-        renameFilterFiles(state, [&](const std::string& file, const char* filter) {
-            auto output = std::make_unique<Outputs>(file, std::string("--filter ") + filter, options_.inputs,
-                                                    options_.policy);
-            if (output->isDevice()) return file;
-            filterFiles_.push_back(std::move(output));
-            return filterFiles_.back()->begin("");
+        renameFilterFiles(state, [&](const std::string& file, const char*) {
+            const auto dump = dumps_.find(file);
+            return dump == dumps_.end() ? file : dump->second->begin("");
         });
         stream.params.setFilters(state);
     }
 }
 
-void Job::discard() {
-    if (outputs_) outputs_->discard();
-    for (auto& file : filterFiles_) file->discard();
+void Job::commit() {
+    std::vector<Outputs*> all;
+    for (Outputs* const one : {outputs_.get(), taskFile_.get()})
+        if (one) all.push_back(one);
+    for (auto& [name, dump] : dumps_) all.push_back(dump.get());
+    Outputs::commit(all);
 }
 
 std::string Job::withFinalNames(std::string text) const {
@@ -295,7 +299,8 @@ std::string Job::withFinalNames(std::string text) const {
          at += options_.output.size())
         text.replace(at, hidden.size(), options_.output);
     if (outputs_) text = outputs_->withFinalNames(std::move(text));
-    for (const auto& file : filterFiles_) text = file->withFinalNames(std::move(text));
+    if (taskFile_) text = taskFile_->withFinalNames(std::move(text));
+    for (const auto& [name, dump] : dumps_) text = dump->withFinalNames(std::move(text));
     return text;
 }
 
@@ -365,7 +370,7 @@ void Job::report(const std::vector<std::string>& names) const {
     std::fprintf(stderr, "tarsel: %s\n", line.c_str());
 }
 
-void Job::runPost(const std::vector<std::string>& names) const {
+void Job::runPost(const std::vector<std::string>& names, Progress& progress, ProgressState state) const {
     const std::string first = names.empty() ? options_.output : names.front();
     const auto stopWith = [&](Exit signalled, Msg why) { throw Failure(signalled, lineOf(why, {first})); };
     if (const Exit signalled = signals_.received(); signalled != Exit::done)
@@ -373,13 +378,22 @@ void Job::runPost(const std::vector<std::string>& names) const {
     std::string line = postCommand(options_.post, options_.inputs, names);
     // The standard output has the result, and nothing else goes there.
     if (stream_ && stream_->isStandardOutput()) line.insert(0, "exec 1>&2\n");
+    state.state = "post";
+    const auto report = [&] {
+        if (progress.isJson()) return progress.report(state);
+        std::fputs("tarsel: the command of --post is running\n", stderr);
+    };
+    // What comes while the command starts is answered as well.
+    const Signals::Watch starting(
+        signals_, {.first = [](int) {}, .second = [&] { return files_->leave(); }, .report = report});
     ShellCommand command(line);
     int status = 0;
     {
-        const Signals::Watch running(
-            signals_, {.first = [&](int signal) { command.signal(signal); },
-                       .second = [&] { return command.kill(), false; },
-                       .report = [] { std::fputs("tarsel: the command of --post is running\n", stderr); }});
+        const Signals::Watch running(signals_, {.first = [&](int signal) { command.signal(signal); },
+                                                .second = [&] { return command.kill(), false; },
+                                                .report = report,
+                                                .last = "stopped and ended the command of --post; " +
+                                                        inQuotes(first) + " is complete"});
         // One that came before there was anybody to pass it on.
         if (const int signal = signals_.number()) command.signal(signal);
         status = command.wait();

@@ -5,10 +5,8 @@
 #include "tarsel/job/job.h"
 #include "tarsel/words/messages.h"
 
-void Job::saveTask() {
-    taskFile_ = std::make_unique<Outputs>(options_.saveTask, "--save-task", options_.inputs, options_.policy);
-    if (outputs_ && taskFile_->output() == outputs_->output())
-        throw failure(Msg::outputIsOutput, {options_.saveTask});
+void Job::storeTask() {
+    if (!taskFile_ && !taskStream_) return;
     QvTask task;
     task.setEncoder(pipe_.get());
     for (const JobStream& s : streams_)
@@ -19,7 +17,12 @@ void Job::saveTask() {
     if (!options_.post.empty()) task.setPostprocessCommand(options_.post.c_str());
     AnyDict state;
     task.store(state);
-    const std::string name = taskFile_->begin("xml");
+    // A stream may wait for its reader, which the first signal ends.
+    const Signals::Watch storing(signals_, {.first = {}, .second = [&] { return files_->leave(); }});
+    // The engine has a name for the standard output, which it writes where it stands.
+    const std::string name = taskFile_                         ? taskFile_->begin("xml")
+                             : taskStream_->isStandardOutput() ? "stdout"
+                                                               : taskStream_->engineName();
     std::string reason;
     try {
         errno = 0;
@@ -28,6 +31,5 @@ void Job::saveTask() {
     } catch (const QvFileException& error) {
         reason = errno != 0 ? std::string(": ") + std::strerror(errno) : error.what();
     }
-    if (!reason.empty()) throw writeFailure(options_.saveTask, reason);
-    taskFile_->commit("xml");
+    if (!reason.empty()) throw writeFailure(options_.saveTask, withFinalNames(reason));
 }

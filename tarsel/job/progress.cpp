@@ -72,11 +72,12 @@ void Progress::finish(const ProgressState& state) {
     const std::lock_guard guard(lock_);
     if (line_ && shown_) std::fputs("\r\x1b[K", stderr);
     shown_ = false;
+    end_ = QvTimer::absoluteTime();
 }
 
 void Progress::report(const ProgressState& state) {
     const std::lock_guard guard(lock_);
-    const double elapsed = QvTimer::absoluteTime() - begin_;
+    const double elapsed = (end_ > 0 ? end_ : QvTimer::absoluteTime()) - begin_;
     const double eta = etaOf(state, elapsed);
     if (json_) return showJson("progress", state, elapsed, eta);
     std::fprintf(stderr, "%starsel:%s  %s\n", line_ ? "\r\x1b[K" : "",

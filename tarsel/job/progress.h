@@ -34,6 +34,7 @@ class Progress {
     // Sends the last event; the line goes.
     void finish(const ProgressState& state);
     bool onTerminal() const { return line_; }
+    bool isJson() const { return json_; }
 
   private:
     void show(const char* event, const ProgressState& state);
@@ -45,6 +46,6 @@ class Progress {
     bool line_ = false, json_ = false, color_ = false;
     std::mutex lock_;  // of what is shown
     bool shown_ = false;
-    double begin_ = 0;             // seconds of the system's counter
+    double begin_ = 0, end_ = 0;   // seconds of the system's counter; 0 before
     std::atomic<double> last_{0};  // likewise
 };

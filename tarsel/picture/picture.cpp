@@ -330,25 +330,26 @@ void addSettings(const AnyDict& state, const AnyDict& initial, std::string& line
 
 namespace {
 
-// The first parameter of a filter that is a file of this kind and names one; empty without.
-std::string fileParam(const QvCodec& filter, int guiControl) {
+// The parameters of a filter that are files of this kind and name one.
+std::vector<std::string> fileParams(const QvCodec& filter, int guiControl) {
+    std::vector<std::string> params;
     const Any set = filter.getParam("paramSet");
     for (int i = 0; set.isVector() && i < set.asVector().size(); ++i) {
         const AnyDict& described = set.asVector().at(i).asDict();
         if (described.getInt32("guiControl", 0) != guiControl) continue;
         const char* name = described.getString("name", "");
         const Any value = filter.getParam(name).toString();
-        if (*value.asString("")) return name;
+        if (*value.asString("")) params.emplace_back(name);
     }
-    return "";
+    return params;
 }
 
 }  // namespace
 
 std::string filterFile(const QvCodec& filter, int guiControl) {
-    const std::string param = fileParam(filter, guiControl);
-    if (param.empty()) return "";
-    const Any value = filter.getParam(param.c_str()).toString();
+    const auto params = fileParams(filter, guiControl);
+    if (params.empty()) return "";
+    const Any value = filter.getParam(params.front().c_str()).toString();
     return value.asString("");
 }
 
@@ -358,8 +359,9 @@ void renameFilterFiles(FiltersState& filters,
     for (int i = 0; i < filters.count(); ++i) {
         AnyDict dict = filters.filterAt(i);
         const std::unique_ptr<QvCodec> filter(qv_registry()->newCodec(names.at(i).asString("")));
-        const std::string param = filter ? fileParam(*filter, QV_GUI_FILESELECT_SAVE) : "";
-        if (param.empty()) continue;
+        const auto params = filter ? fileParams(*filter, QV_GUI_FILESELECT_SAVE) : std::vector<std::string>();
+        if (params.empty()) continue;
+        const std::string& param = params.front();
         const Any initial = filter->getParam(param.c_str());
         filter->restore(dict);
         const Any file = filter->getParam(param.c_str()).toString();
@@ -371,25 +373,19 @@ void renameFilterFiles(FiltersState& filters,
     }
 }
 
-void checkFilterFiles(const QvVProcessPipe& pipe, const std::vector<std::string>& inputs,
-                      const Outputs* outputs, const OutputPolicy& policy) {
-    const auto checkOutput = [&](const std::string& name, Msg what) {
-        if (outputs && !outputs->isDevice() && samePlace(name, outputs->output()))
-            throw failure(what, {name});
-    };
-    std::vector<std::string> read = inputs;
-    for (int i = 0; i < pipe.nrFilters(); ++i)
-        if (const auto name = filterFile(*pipe.filter(i), QV_GUI_FILESELECT_LOAD); !name.empty()) {
-            checkOutput(name, Msg::outputIsInput);
-            read.push_back(name);
-        }
+FilterFiles filterFiles(const QvVProcessPipe& pipe) {
+    FilterFiles files;
     for (int i = 0; i < pipe.nrFilters(); ++i) {
         const QvCodec& filter = *pipe.filter(i);
-        const std::string name = filterFile(filter, QV_GUI_FILESELECT_SAVE);
-        if (name.empty()) continue;
-        const Outputs checked(name, std::string("--filter ") + filter.name(), read, policy);
-        checkOutput(name, Msg::outputIsOutput);
+        auto params = fileParams(filter, QV_GUI_FILESELECT_LOAD);
+        params.emplace_back("font_filename");  // which not every filter describes
+        for (const auto& param : params)
+            if (const Any value = filter.getParam(param.c_str()); value.isText())
+                files.read.emplace_back(value.toString().asString(""));
+        if (const auto name = filterFile(filter, QV_GUI_FILESELECT_SAVE); !name.empty())
+            files.written.push_back({name, filter.name()});
     }
+    return files;
 }
 
 std::unique_ptr<QvVProcessPipe> tryPipe(const VideoJobDescription& job) {

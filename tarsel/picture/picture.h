@@ -8,7 +8,6 @@
 
 #include <qvplugcore/qvplugcore.h>
 
-#include "tarsel/host/outputs/outputs.h"
 #include "tarsel/picture/effects.h"
 #include "tarsel/source/source.h"
 
@@ -66,10 +65,15 @@ std::string filterFile(const QvCodec& filter, int guiControl);
 void renameFilterFiles(FiltersState& filters,
                        const std::function<std::string(const std::string& file, const char* filter)>& other);
 
-// That what filters read is not overwritten by `outputs` (null: there is none), and what they write is
-// neither an input nor an output and, unless `policy` overwrites, does not exist. Throws Failure.
-void checkFilterFiles(const QvVProcessPipe& pipe, const std::vector<std::string>& inputs,
-                      const Outputs* outputs, const OutputPolicy& policy);
+// The files that the filters of a pipe have been given.
+struct FilterFiles {
+    struct Written {
+        std::string file, filter;
+    };
+    std::vector<std::string> read;
+    std::vector<Written> written;
+};
+FilterFiles filterFiles(const QvVProcessPipe& pipe);
 
 // The pipe of a job, null if it has nothing to do. Each filter has been tried, so that what fails later fails
 // by chance. Throws Failure.

@@ -114,6 +114,7 @@ Source::Source(const std::string& spec, const std::string& raw) : name_(spec) {
         openGenerator(spec);
         return;
     }
+    files_.push_back(spec);
     requireInput(spec);
     if (raw.empty())
         openFile();
@@ -157,6 +158,7 @@ void Source::openGenerator(const std::string& spec) {
     if (const std::string* picture = keys.find("picture")) {
         requirePicture(*picture);
         video.set("picture", picture->c_str());
+        files_.push_back(*picture);
     }
     audio.set("duration", Any(duration));
     AnyVector vids, auds;

@@ -23,6 +23,8 @@ class Source {
     // Bytes of the file; negative when it is none.
     long long bytes() const;
     bool isFile() const { return isFile_; }
+    // What is read: the file, or the picture that the generator shows.
+    const std::vector<std::string>& files() const { return files_; }
 
     // Of the first video stream.
     std::optional<QvFramerate> frameRate() const;
@@ -43,6 +45,7 @@ class Source {
 
     std::string name_;
     bool isFile_ = true;
+    std::vector<std::string> files_;
     std::unique_ptr<QvDecodePipe> decoder_;
 };
 

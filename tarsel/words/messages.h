@@ -190,6 +190,8 @@ enum class Msg : unsigned char {
     recoverUnfinished,
     staleNoAge,
     // outputs that are streams
+    streamIsSocket,
+    planAndTask,
     streamClosed,
     streamToTerminal,
     streamNeedsFormat,
@@ -224,7 +226,6 @@ enum class Msg : unsigned char {
     taskFailed,
     engineWarns,
     outOfMemory,
-    temporaryFolder,
     pathFailed,
     systemFailed,
     engineFailed,

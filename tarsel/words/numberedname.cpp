@@ -1,7 +1,9 @@
 #include "tarsel/words/numberedname.h"
 
 #include <algorithm>
+#include <charconv>
 #include <filesystem>
+#include <limits>
 
 #include "tarsel/words/messages.h"
 
@@ -83,15 +85,18 @@ std::string NumberedName::plain(std::string_view extension) const {
     return name + std::string(extension);
 }
 
-bool NumberedName::matches(std::string_view name, std::string_view extension) const {
+std::optional<long long> NumberedName::numberOf(std::string_view name, std::string_view extension) const {
     const std::string end = after_ + (extension.empty() ? extension_ : std::string(extension));
     if (name.size() <= before_.size() + end.size() || !name.starts_with(before_) || !name.ends_with(end))
-        return false;
+        return std::nullopt;
     const std::string_view digits = name.substr(before_.size(), name.size() - before_.size() - end.size());
-    if (!std::all_of(digits.begin(), digits.end(), isDigit)) return false;
+    if (!std::all_of(digits.begin(), digits.end(), isDigit)) return std::nullopt;
     // "%04d" never writes 12 as 00012.
     const auto least = static_cast<size_t>(digits_);
-    return digits.size() == least || (digits.size() > least && digits[0] != '0');
+    if (digits.size() != least && (digits.size() < least || digits[0] == '0')) return std::nullopt;
+    long long number = 0;
+    const auto read = std::from_chars(digits.data(), digits.data() + digits.size(), number);
+    return read.ec == std::errc() ? number : std::numeric_limits<long long>::max();
 }
 
 std::string withoutEscapes(std::string name) {

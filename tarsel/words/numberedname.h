@@ -18,8 +18,12 @@ class NumberedName {
     // The name of what has no number, as the sound next to pictures: without the place of the number and what
     // separates it.
     std::string plain(std::string_view extension) const;
-    // Whether `name` is at(n, extension) for some n.
-    bool matches(std::string_view name, std::string_view extension = "") const;
+    // The n of which `name` is at(n, extension); one too large for the type is its largest number. Nothing
+    // for other names.
+    std::optional<long long> numberOf(std::string_view name, std::string_view extension = "") const;
+    bool matches(std::string_view name, std::string_view extension = "") const {
+        return numberOf(name, extension).has_value();
+    }
 
   private:
     NumberedName() = default;

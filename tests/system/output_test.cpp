@@ -1,5 +1,7 @@
 // Outputs: whole or absent, never over something that was not meant.
+#include <sys/socket.h>
 #include <sys/stat.h>
+#include <sys/un.h>
 
 #include "tests/system/tool.h"
 
@@ -175,6 +177,119 @@ TEST_F(Output, AShorterRunLeavesNoTail) {
     EXPECT_EQ(listing(), before);
     works({"transcode", "testgen:size=32x32,rate=25,duration=0.08,audio=0", "-o", "card.png", "-y"});
     EXPECT_EQ(listing(), (std::set<std::string>{"in.wav", "card#0.png", "card#1.png"}));
+}
+
+// Whatever a filter or the generator reads is an input, also for names that are made from the output's.
+TEST_F(Output, NeverOverWhatAFilterReads) {
+    const std::string card = "testgen:size=64x48,rate=25,audio=0,duration=";
+    works({"frame", "testgen:size=32x32", "-o", "o#9.png"});
+    folder.write("talk.srt", "1\n00:00:00,000 --> 00:00:01,000\nHello\n");
+    for (const auto& entry : fs::recursive_directory_iterator("/usr/share/fonts"))
+        if (entry.path().extension() == ".ttf" && !fs::exists(folder.file("f.ttf")))
+            fs::copy_file(entry.path(), folder.file("f.ttf"));
+    fs::create_symlink("o#9.png", folder.file("soft.png"));
+    const std::string logo = contents("o#9.png"), talk = contents("talk.srt");
+    const Words drawn{"--logo", "o#9.png@0,0", "-y"}, titled{"--subtitles", "talk.srt", "-y"};
+    const struct {
+        Words job;
+        std::string name;
+    } rows[] = {
+        {Words{"transcode", card + "0.4", "-o", "o.png"} + drawn, "o#9.png"},
+        {Words{"transcode", card + "0.4", "-o", "o.png", "--logo", "soft.png@0,0", "-y"}, "o#9.png"},
+        {{"transcode", card + "0.4,picture=o#9.png", "-o", "o.png", "-y"}, "o#9.png"},
+        {Words{"transcode", card + "0.4", "-o", "x.avi", "--save-task", "o#9.png"} + drawn, "o#9.png"},
+        {Words{"transcode", card + "0.4", "-o", "x.avi", "--save-task", "talk.srt"} + titled, "talk.srt"},
+        {Words{"transcode", card + "0.4", "-o", "x.avi", "--save-task", "talk.srt", "--dry-run"} + titled,
+         "talk.srt"},
+        {Words{"transcode", card + "0.4", "-o", "x.avi", "--filter", "rawdump:filename=talk.srt"} + titled,
+         "talk.srt"},
+        {{"transcode", card + "0.4", "-o", "x.avi", "--save-task", "f.ttf", "--timecode=font=f.ttf", "-y"},
+         "f.ttf"},
+        {Words{"frame", "testgen:size=64x48", "-o", "o#9.png"} + drawn, "o#9.png"},
+        {{"frame", "testgen:size=64x48,picture=o#9.png", "-o", "o#9.png", "-y"}, "o#9.png"},
+    };
+    for (const auto& row : rows) fails(4, row.job, {"'" + row.name + "'", "also an input"});
+    // Five pictures don't reach its number: it is no tail of theirs.
+    works({"transcode", card + "0.4,picture=soft.png", "-o", "o.png", "--to", "0.2", "-y"});
+    for (int i = 0; i < 2; ++i) works(Words{"transcode", card + "0.2", "-o", "o.png"} + drawn);
+    EXPECT_TRUE(contents("o#9.png") == logo);
+    EXPECT_EQ(contents("talk.srt"), talk);
+    EXPECT_GT(size("o#4.png"), 0);
+}
+
+TEST_F(Output, NothingIsWrittenTwice) {
+    fs::create_directory(folder.file("sub"));
+    fs::create_symlink("card.raw", folder.file("link.raw"));
+    mkfifo(folder.file("pipe").c_str(), 0600);
+    const auto dump = [](const std::string& name) { return Words{"--filter", "rawdump:filename=" + name}; };
+    const struct {
+        int status;
+        Words options;
+        Words parts;
+    } rows[] = {
+        {2, {"-o", "card.raw", "--save-task", "card.wav"}, {"'card.wav'", "two files"}},
+        {4, {"-o", "card.raw", "--save-task", "./card.raw"}, {"'./card.raw'", "the output of the job"}},
+        {4, {"-o", "card.raw", "--save-task", "sub/../link.raw", "-y"}, {"link.raw'", "the output"}},
+        {2, Words{"-o", "card.raw", "--save-task", "x"} + dump("./x"), {"x'", "two files"}},
+        {2, Words{"-o", "card.raw"} + dump("card.wav"), {"'card.wav'", "two files"}},
+        {2, Words{"-o", "card.raw"} + dump("x") + dump("sub/../x"), {"x'", "two files"}},
+        {2, Words{"-o", "card.png"} + dump("card#03.png"), {"'card#03.png'", "two files"}},
+        {2, Words{"-o", "pipe", "--format", "raw"} + dump("./pipe"), {"'./pipe'", "two files"}},
+        {2, Words{"-o", "card.raw", "--save-task", "pipe"} + dump("pipe"), {"'pipe'", "two files"}},
+        {2, {"-o", "-", "--format", "raw", "--save-task", "/dev/stdout"}, {"'/dev/stdout'", "two files"}},
+        {2, {"-o", "card.raw", "--save-task", "-", "--dry-run"}, {"--save-task", "the plan of --dry-run"}},
+        {2, {"-o", "card.wav", "--format", "raw"}, {"'card.wav'", "two files", "the extension"}},
+    };
+    for (const auto& row : rows) fails(row.status, Words{"transcode", kCard} + row.options, row.parts);
+    works(Words{"transcode", kCard, "-o", "card.raw"} + dump("/dev/null") + dump("/dev/null"));
+}
+
+// The task file gets its name with the output; a stream has it at once.
+TEST_F(Output, TheTaskFileIsPartOfTheJob) {
+    folder.write("job.xml", "old");
+    const Words job{"transcode", "in.wav", "-o", "out.wav", "-y", "--save-task"};
+    ProcessOptions limited = here();
+    limited.fileLimit = 3000;  // the task has room, the sound has not
+    makeWav("in.wav", 10000);
+    EXPECT_EQ(tarsel(job + Words{"job.xml"}, limited).status, 4);
+    EXPECT_EQ(contents("job.xml"), "old");
+    works(job + Words{"job.xml"});
+    const std::string task = contents("job.xml");
+    EXPECT_THAT(task, testing::HasSubstr("out.wav"));
+    EXPECT_EQ(works(job + Words{"-"}).out, task);
+    ProcessOptions into = here();
+    into.outputTo = folder.write("log", "");
+    EXPECT_EQ(tarsel(job + Words{"-"}, into).status, 0);
+    EXPECT_EQ(contents("log"), task);
+    EXPECT_EQ(listing(), (std::set<std::string>{"in.wav", "job.xml", "log", "out.wav"}));
+}
+
+TEST_F(Output, ASocketIsNoFile) {
+    const int listener = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
+    sockaddr_un address{};
+    address.sun_family = AF_UNIX;
+    fs::current_path(folder.path());
+    std::strcpy(address.sun_path, "s.raw");
+    ASSERT_EQ(bind(listener, reinterpret_cast<const sockaddr*>(&address), sizeof address), 0);
+    ASSERT_EQ(listen(listener, 1), 0);
+    fs::current_path("/");
+    folder.write("t.srt", "1\n00:00:00,000 --> 00:00:01,000\nHello\n");
+    for (const auto& job :
+         {Words{"transcode", kCard, "-o", "s.raw"}, {"captions", "t.srt", "--vtt", "-o", "s.raw"}})
+        fails(4, job, {"'s.raw'", "it is a socket", "-o -"});
+    close(listener);
+}
+
+TEST_F(Output, ALogThatIsFull) {
+    for (const auto& [job, status] : {std::pair{Words{"transcode", "in.wav", "-o", "out.wav"}, 0},
+                                      {Words{"transcode", "none.wav", "-o", "other.wav"}, 3}}) {
+        const Outcome o = tarsel(Words{"--log", "/dev/full"} + job);
+        EXPECT_EQ(o.status, status);
+        const std::string line = "tarsel: warning: can't write the log '/dev/full': the disk is full; ";
+        const size_t at = o.err.find(line);
+        ASSERT_NE(at, std::string::npos) << o.err;
+        EXPECT_EQ(o.err.find(line, at + 1), std::string::npos);
+    }
 }
 
 // Killed while it writes: the next run in the folder removes what is left, and says so unless it is told not

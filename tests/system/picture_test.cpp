@@ -77,6 +77,14 @@ TEST_F(Picture, AFileThatEndsWithinAFrame) {
     EXPECT_TRUE(contents("clip.yuv").substr(0, 2 * kFrame) == contents("out.yuv"));
 }
 
+TEST_F(Picture, ASinglePictureOfACutFile) {
+    makeYuv("clip.yuv", 2.5);
+    const Words shot = asYuv({"frame", "clip.yuv", "-o", "x.png"});
+    fails(3, shot, {"'clip.yuv' is damaged", "after 2 whole ones", "--accept-partial"});
+    EXPECT_THAT(works(shot + Words{"--accept-partial"}).err,
+                testing::HasSubstr("tarsel: warning: 'clip.yuv' is damaged"));
+}
+
 TEST_F(Picture, SizesThatAreNone) {
     makeYuv("clip.yuv", 1);
     for (const char* size : {"0x48", "64x-1", "64x100000", "x", "64x48x2", "6e1x48", ""}) {

@@ -20,7 +20,7 @@ bool keepAccessList(int from, int to) {
     const std::string name = "/proc/self/fd/" + std::to_string(from);
     char list[4096];
     const ssize_t size = getxattr(name.c_str(), kAccessList, list, sizeof list);
-    if (size < 0) return errno != ERANGE;
+    if (size < 0) return errno == ENODATA || errno == ENOTSUP;
     return fsetxattr(to, kAccessList, list, static_cast<size_t>(size), 0) == 0;
 }
 

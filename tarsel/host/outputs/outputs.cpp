@@ -12,7 +12,6 @@
 #include "tarsel/host/outputs/attributes.h"
 #include "tarsel/host/outputs/foldercalls.h"
 #include "tarsel/host/outputs/recovery.h"
-#include "tarsel/host/outputs/streamoutput.h"
 #include "tarsel/words/failure.h"
 #include "tarsel/words/messages.h"
 
@@ -20,7 +19,8 @@ namespace fs = std::filesystem;
 
 namespace {
 
-// Of the files in the hidden folder; whatever the final name holds, the engine handles this one.
+// Of the files in the hidden folder; whatever the final name holds, the engine handles this one. Where
+// several outputs write into a folder, the others have a number in front.
 const std::string kBase = "out";
 // What can follow it.
 constexpr const char* kNameLetters = "#.0123456789abcdefghijklmnopqrstuvwxyz";
@@ -34,6 +34,10 @@ fs::path sibling(const fs::path& name, const std::string& filename) {
     return name.has_parent_path() ? name.parent_path() / filename : fs::path(filename);
 }
 
+fs::path inFolder(const std::string& folder, const std::string& filename) {
+    return folder == "." ? fs::path(filename) : fs::path(folder) / filename;
+}
+
 [[noreturn]] void refuse(const fs::path& name, const std::string& why) {
     throw Failure(Exit::output, "can't write " + inQuotes(name.string()) + ": " + why);
 }
@@ -41,14 +45,6 @@ fs::path sibling(const fs::path& name, const std::string& filename) {
 bool sameFile(const fs::path& a, const fs::path& b) {
     std::error_code error;
     return fs::equivalent(a, b, error) && !error;
-}
-
-// A redirected stream may be a plain file that the shell has opened: it is written as a stream all the same.
-bool takesStream(const fs::path& name) {
-    std::error_code error;
-    const auto status = fs::status(name, error);
-    if (!fs::exists(status) || fs::is_directory(status)) return false;
-    return !fs::is_regular_file(status) || StreamOutput::namesDescriptor(name.string());
 }
 
 void checkFolder(const fs::path& name) {
@@ -92,34 +88,35 @@ std::string shapeOf(std::string_view name) {
     return shape;
 }
 
-// Those with a hidden folder: a job, its task file, and what its filters write.
-std::atomic<Outputs*> g_live[16];
-
-void replaceLive(Outputs* former, Outputs* now) {
-    for (auto& live : g_live) {
-        Outputs* expected = former;
-        if (live.compare_exchange_strong(expected, now)) return;
-    }
+// The number in "card#0007.png" behind "card#"; -1 for another name, or a number beyond any use.
+long long numberIn(const std::string& name, const std::string& start, const std::string& extension) {
+    const size_t end = name.size() - std::min(name.size(), extension.size());
+    if (name.rfind(start, 0) != 0 || end <= start.size() || name.substr(end) != extension) return -1;
+    const std::string digits = name.substr(start.size(), end - start.size());
+    if (digits.size() > 18 || digits.find_first_not_of("0123456789") != std::string::npos) return -1;
+    return std::stoll(digits);
 }
 
 }  // namespace
 
 Outputs::Outputs(const std::string& output, const std::string& option, const std::vector<std::string>& inputs,
-                 const OutputPolicy& policy)
-    : output_(output), inputs_(inputs), policy_(policy), device_(takesStream(output)) {
+                 const OutputPolicy& policy, std::shared_ptr<Transaction> with)
+    : output_(output),
+      inputs_(inputs),
+      policy_(policy),
+      transaction_(with ? std::move(with) : std::make_shared<Transaction>()),
+      base_(kBase) {
     std::error_code error;
     if (output.empty()) throw Failure(Exit::usage, option + ": the name of the output is empty");
     // The engine takes both slashes for separators.
     if (folderOf(output_).string().find('\\') != std::string::npos)
         refuse(output_, "a backslash can't stand in the name of the folder");
     if (fs::is_directory(output_, error)) refuse(output_, "this is a folder; give a file name in it");
-    if (!device_) {
-        target_ = followed(output_);
-        checkFolder(output_);
-        putInOrder(folderOf(output_));
-    }
+    target_ = followed(output_);
+    checkFolder(output_);
+    putInOrder(folderOf(output_));
     checkFinal(output_);
-    if (device_ || target_ == output_) return;
+    if (target_ == output_) return;
     checkFolder(target_);
     if (folderOf(target_) != folderOf(output_)) putInOrder(folderOf(target_));
 }
@@ -132,17 +129,24 @@ void Outputs::putInOrder(const fs::path& folder) const {
         std::fprintf(stderr, "tarsel: %s\n", line.c_str());
 }
 
-Outputs::~Outputs() { discard(); }
+bool Outputs::isInput(const fs::path& name) const {
+    return std::any_of(inputs_.begin(), inputs_.end(),
+                       [&](const auto& input) { return sameFile(input, name); });
+}
+
+void Outputs::addInputs(const std::vector<std::string>& files) {
+    for (const auto& file : files)
+        if (std::find(inputs_.begin(), inputs_.end(), file) == inputs_.end()) inputs_.push_back(file);
+    if (isInput(output_)) throw failure(Msg::outputIsInput, {output_.string()});
+}
 
 void Outputs::checkFinal(const fs::path& name) const {
-    for (const auto& input : inputs_)
-        if (sameFile(input, name)) throw failure(Msg::outputIsInput, {name.string()});
+    if (isInput(name)) throw failure(Msg::outputIsInput, {name.string()});
     std::error_code error;
     const auto status = fs::symlink_status(name, error);
     if (error && status.type() == fs::file_type::none) refuse(name, inLine(error.message()));
-    if (!policy_.overwrite && !device_ && fs::exists(status))
-        throw failure(Msg::outputExists, {name.string()});
-    if (!device_ && fs::is_directory(name, error)) refuse(name, "a folder of this name is in the way");
+    if (!policy_.overwrite && fs::exists(status)) throw failure(Msg::outputExists, {name.string()});
+    if (fs::is_directory(name, error)) refuse(name, "a folder of this name is in the way");
 }
 
 void Outputs::number(const NumberedName& name) {
@@ -150,11 +154,15 @@ void Outputs::number(const NumberedName& name) {
     expectSet();
 }
 
-void Outputs::checkNumbered(const std::string& extension) const {
+void Outputs::checkNumbered(const std::string& extension, long long count) const {
     if (numbered_) {
-        for (const auto& entry : fs::directory_iterator(folderOf(output_)))
-            if (const std::string name = entry.path().filename().string(); numbered_->matches(name))
-                checkFinal(sibling(output_, name));
+        for (const auto& entry : fs::directory_iterator(folderOf(output_))) {
+            const std::string name = entry.path().filename().string();
+            const auto number = numbered_->numberOf(name);
+            if (!number) continue;
+            const fs::path found = sibling(output_, name);
+            if (*number < count || !isInput(found)) checkFinal(found);
+        }
         return;
     }
     const std::string stem = output_.stem().string() + "#";
@@ -162,14 +170,16 @@ void Outputs::checkNumbered(const std::string& extension) const {
         const std::string name = entry.path().filename().string();
         if (name.rfind(stem, 0) != 0 || entry.path().extension() != "." + extension) continue;
         const std::string number = entry.path().stem().string().substr(stem.size());
-        if (!number.empty() && number.find_first_not_of("0123456789#") == std::string::npos)
-            checkFinal(sibling(output_, name));
+        if (number.empty() || number.find_first_not_of("0123456789#") != std::string::npos) continue;
+        const fs::path found = sibling(output_, name);
+        if (numberIn(name, stem, "." + extension) < count || !isInput(found)) checkFinal(found);
     }
 }
 
 std::string Outputs::withFinalNames(std::string text) const {
-    const std::string hidden = (fs::path(work_.path()) / kBase).string();
-    if (numbered_ && !work_.path().empty()) {
+    if (!place_) return text;
+    const std::string hidden = (fs::path(place_->work.path()) / base_).string();
+    if (numbered_) {
         for (size_t at = 0; (at = text.find(hidden, at)) != std::string::npos; ++at) {
             const size_t end =
                 std::min(text.find_first_not_of(kNameLetters, at + hidden.size()), text.size());
@@ -177,9 +187,9 @@ std::string Outputs::withFinalNames(std::string text) const {
         }
         return text;
     }
-    const std::string shown = (output_.parent_path() / output_.stem()).string();
-    for (size_t at = 0; !work_.path().empty() && (at = text.find(hidden, at)) != std::string::npos;
-         at += shown.size())
+    const std::string shown =
+        (extension_.empty() ? output_ : output_.parent_path() / output_.stem()).string();
+    for (size_t at = 0; (at = text.find(hidden, at)) != std::string::npos; at += shown.size())
         text.replace(at, hidden.size(), shown);
     return text;
 }
@@ -189,23 +199,13 @@ std::string Outputs::hiddenName(const std::string& extension) const {
 }
 
 std::string Outputs::begin(const std::string& extension) {
+    const fs::path where = folderOf(set_ ? output_ : target_);
+    if (const int error = transaction_->enter(where.string(), place_))
+        refuse(output_, inLine(std::strerror(error)));
     extension_ = extension;
-    // What is written to a device or a pipe goes straight there, by a link in a folder elsewhere.
-    const fs::path where = device_ ? fs::temp_directory_path() : folderOf(set_ ? output_ : target_);
-    // Nothing of a user's lies there, so there is nothing to say of it.
-    if (device_ && policy_.recover) recoverPlace(where.string(), {.stale = policy_.stale, .sync = false});
-    {
-        std::lock_guard guard(lock_);
-        if (const int error = work_.make(where.string())) refuse(output_, inLine(std::strerror(error)));
-        replaceLive(nullptr, this);
-    }
-    fs::path name = fs::path(work_.path()) / kBase;
+    if (const size_t number = place_->members++; number > 0) base_ = std::to_string(number) + "-" + kBase;
+    fs::path name = fs::path(place_->work.path()) / base_;
     if (!extension.empty()) name += "." + extension;
-    if (device_) {
-        std::error_code error;
-        fs::create_symlink(fs::absolute(output_), name, error);
-        if (error) refuse(output_, inLine(error.message()));
-    }
     return name.string();
 }
 
@@ -220,7 +220,7 @@ std::string Outputs::numberedName(const std::string& rest, const std::string& fr
 }
 
 std::string Outputs::finalName(const fs::path& written, const std::string& from) const {
-    const std::string rest = written.filename().string().substr(kBase.size());
+    const std::string rest = written.filename().string().substr(base_.size());
     if (numbered_ && !rest.empty()) return sibling(output_, numberedName(rest, from)).string();
     // What was begun without an extension keeps the whole name.
     fs::path name = rest.empty() ? output_.filename() : output_.stem();
@@ -228,35 +228,53 @@ std::string Outputs::finalName(const fs::path& written, const std::string& from)
     return (output_.has_parent_path() ? output_.parent_path() / name : name).string();
 }
 
+bool Outputs::numbers(const std::string& place, const std::string& extension) const {
+    const fs::path other(place), own(placeOf(output_));
+    if (other.parent_path() != own.parent_path()) return false;
+    const std::string name = other.filename().string();
+    if (numbered_) return numbered_->matches(name);
+    return numberIn(name, output_.stem().string() + "#", "." + extension) >= 0;
+}
+
+// A link is followed by an output of one file.
+fs::path Outputs::targetOf(const fs::path& name) const { return !set_ && name == output_ ? target_ : name; }
+
+std::string Outputs::placeOf(const fs::path& name) const {
+    const fs::path target = targetOf(name);
+    std::error_code error;
+    return (fs::weakly_canonical(folderOf(target), error) / target.filename()).string();
+}
+
 std::vector<fs::path> Outputs::written() const {
     std::vector<fs::path> files;
-    if (device_ || !work_) return files;
+    if (!place_ || !place_->work) return files;
+    const int work = place_->work.handle();
     std::vector<std::string> names;
-    if (const int error = listFolder(work_.handle(), names)) refuse(output_, inLine(std::strerror(error)));
-    if (isRemoved(work_.handle())) throw failure(Msg::outputFolderGone, {output_.string()});
+    if (const int error = listFolder(work, names)) refuse(output_, inLine(std::strerror(error)));
+    if (isRemoved(work)) throw failure(Msg::outputFolderGone, {output_.string()});
     for (const auto& name : names)
-        if (name.rfind(kBase, 0) == 0) files.push_back(fs::path(work_.path()) / name);
+        if (name.rfind(base_, 0) == 0) files.push_back(fs::path(place_->work.path()) / name);
     std::sort(files.begin(), files.end());
     return files;
 }
 
-bool Outputs::mayGo(const fs::path& name) const {
+// Whether the entry `name` beside the output may be removed as one of its former files.
+bool Outputs::mayGo(const std::string& name) const {
     std::error_code error;
-    return !fs::is_directory(fs::symlink_status(name, error)) &&
-           std::none_of(inputs_.begin(), inputs_.end(),
-                        [&](const auto& input) { return sameFile(input, name); });
+    const fs::path path = sibling(output_, name);
+    return !fs::is_directory(fs::symlink_status(path, error)) && !isInput(path);
 }
 
 // The same for numbered names: all that have a number of this form, and next to pictures their sound.
 std::vector<std::string> Outputs::formerNumbers(const std::vector<Manifest::Row>& fresh) const {
     std::set<std::string> names, extensions = {""};
     for (const auto& row : fresh) {
-        if (entryExists(work_.place(), row.name.c_str())) names.insert(row.name);
+        if (entryExists(place_->work.place(), row.name.c_str())) names.insert(row.name);
         const std::string extension = fs::path(row.name).extension().string();
         if (numbered_->matches(row.name, extension)) extensions.insert(extension);
     }
     std::vector<std::string> all;
-    if (const int error = listFolder(work_.place(), all))
+    if (const int error = listFolder(place_->work.place(), all))
         throw failure(Msg::outputNotPlaced, {output_.string(), std::strerror(error)});
     bool hadPictures = false;
     std::vector<std::string> sound;
@@ -270,7 +288,7 @@ std::vector<std::string> Outputs::formerNumbers(const std::vector<Manifest::Row>
                            [&](const auto& extension) { return numbered_->matches(name, extension); });
     };
     for (const auto& name : all) {
-        if (!mayGo(sibling(output_, name))) continue;
+        if (!mayGo(name)) continue;
         if (isSound(name)) sound.push_back(name);
         if (!isOurs(name)) continue;
         names.insert(name);
@@ -289,20 +307,20 @@ std::vector<std::string> Outputs::formerSet(const std::vector<Manifest::Row>& fr
     const auto isPicture = [](const std::string& shape) { return shape.ends_with("##.png"); };
     std::set<std::string> shapes, names;
     for (const auto& row : fresh) {
-        if (entryExists(work_.place(), row.name.c_str())) names.insert(row.name);
+        if (entryExists(place_->work.place(), row.name.c_str())) names.insert(row.name);
         if (row.name.rfind(stem, 0) == 0 && ending(row.name).find("##") == 0) shapes.insert(ending(row.name));
     }
     if (shapes.empty()) return {names.begin(), names.end()};
     const bool pictures = std::any_of(shapes.begin(), shapes.end(), isPicture);
     bool hadPictures = false;
     std::vector<std::string> all, sound;
-    if (const int error = listFolder(work_.place(), all))
+    if (const int error = listFolder(place_->work.place(), all))
         throw failure(Msg::outputNotPlaced, {output_.string(), std::strerror(error)});
     for (const auto& name : all) {
         if (name.rfind(stem, 0) != 0) continue;
         const std::string shape = ending(name);
         const bool isSound = pictures && (shape == ".wav" || shape == "##.wav");
-        if ((!isSound && shapes.count(shape) == 0) || !mayGo(sibling(output_, name))) continue;
+        if ((!isSound && shapes.count(shape) == 0) || !mayGo(name)) continue;
         if (isSound)
             sound.push_back(name);
         else
@@ -314,89 +332,62 @@ std::vector<std::string> Outputs::formerSet(const std::vector<Manifest::Row>& fr
     return {names.begin(), names.end()};
 }
 
-Manifest Outputs::plan(const std::vector<fs::path>& files, const std::string& from) const {
-    Manifest set;
-    for (const auto& file : files) {
-        const fs::path name = finalName(file, from);
+// Adds what this output writes and replaces to the set of its place.
+void Outputs::plan() {
+    std::vector<Manifest::Row> fresh;
+    for (const auto& file : written()) {
+        const fs::path name = finalName(file, extension_);
         checkFinal(name);
-        const bool followsLink = !set_ && name == output_;
-        set.fresh.push_back({file.filename().string(), (followsLink ? target_ : name).filename().string()});
+        fresh.push_back({file.filename().string(), targetOf(name).filename().string()});
+        names_.push_back(name.string());
     }
-    if (!policy_.overwrite) return set;
-    for (const auto& name : formerSet(set.fresh))
-        set.old.push_back({"old-" + std::to_string(set.old.size()), name});
-    for (const auto& row : set.fresh)
+    const auto first = std::find(names_.begin(), names_.end(), output_.string());
+    if (first != names_.end()) std::rotate(names_.begin(), first, first + 1);
+    if (fresh.empty()) return;
+    Manifest& set = place_->set;
+    const auto namesOf = [](const std::vector<Manifest::Row>& rows) {
+        std::set<std::string> names;
+        for (const auto& row : rows) names.insert(row.name);
+        return names;
+    };
+    auto given = namesOf(set.fresh), taken = namesOf(set.old);
+    for (const auto& row : fresh) {
+        if (!given.insert(row.name).second)
+            throw failure(Msg::outputTwice,
+                          {inFolder(place_->folder, row.name).string(), "give one of them another name"});
+        set.fresh.push_back(row);
+    }
+    if (!policy_.overwrite) return;
+    for (const auto& name : formerSet(fresh))
+        if (taken.insert(name).second) set.old.push_back({"old-" + std::to_string(set.old.size()), name});
+    const WorkFolder& work = place_->work;
+    for (const auto& row : fresh)
         if (const int error =
-                keepAttributes(work_.handle(), row.hidden.c_str(), work_.place(), row.name.c_str()))
-            notPlaced({error, row.name, false});
-    return set;
+                keepAttributes(work.handle(), row.hidden.c_str(), work.place(), row.name.c_str()))
+            notPlaced({error, row.name, false}, place_->folder);
 }
 
-void Outputs::notPlaced(const PlaceResult& result) const {
+void Outputs::notPlaced(const PlaceResult& result, const std::string& folder) const {
     const std::string name =
-        (result.name.empty() ? output_ : sibling(output_, std::string(result.name))).string();
+        (result.name.empty() ? output_ : inFolder(folder, std::string(result.name))).string();
     const std::string reason = std::strerror(result.error);
     if (!result.torn && result.error == EEXIST) throw failure(Msg::outputExists, {name});
     if (!result.torn) throw failure(Msg::outputNotPlaced, {name, reason});
-    throw failure(Msg::outputTorn, {name, reason, folderOf(set_ ? output_ : target_).string()});
+    throw failure(Msg::outputTorn, {name, reason, folder});
 }
 
-// Files are brought to the disk before the lock is taken: a second signal must not wait for that.
-void Outputs::place(const Manifest& set) {
-    const bool one = set.fresh.size() == 1 &&
-                     (set.old.empty() || (set.old.size() == 1 && set.old[0].name == set.fresh[0].name));
-    SetPlacement placement(work_.handle(), work_.place(), set, policy_.sync);
-    PlaceResult result;
-    if (!one)
-        result = placement.prepare();
-    else if (policy_.sync)
-        result.error = syncFile(work_.handle(), set.fresh[0].hidden.c_str());
-    if (result.error != 0)
-        throw failure(Msg::outputNotSynced, {output_.string(), std::strerror(result.error)});
-    {
-        std::lock_guard guard(lock_);
-        moving_ = true;
-        result = one ? placeOne(work_.handle(), work_.place(), set.fresh[0], policy_.overwrite, policy_.sync)
-                     : placement.run();
-        if (result.torn) {
-            replaceLive(this, nullptr);
-            work_.leave();
-        }
-        moving_ = false;
-        placed_ = result.error == 0;
-    }
-    if (result.error != 0) notPlaced(result);
+void Outputs::commit() {
+    Outputs* const self[] = {this};
+    commit(self);
 }
 
-std::vector<std::string> Outputs::commit(const std::string& from) {
-    if (device_) {
-        discard();
-        return {output_.string()};
-    }
-    const std::vector<fs::path> files = written();
-    std::vector<std::string> names;
-    for (const auto& file : files) names.push_back(finalName(file, from));
-    if (!files.empty()) place(plan(files, from));
-    discard();
-    const auto first = std::find(names.begin(), names.end(), output_.string());
-    if (first != names.end()) std::rotate(names.begin(), first, first + 1);
-    return names;
-}
-
-void Outputs::discard() {
-    std::lock_guard guard(lock_);
-    if (!work_) return;
-    replaceLive(this, nullptr);
-    work_.remove();
-}
-
-bool Outputs::abandonAll() {
-    bool any = false;
-    for (auto& live : g_live) {
-        Outputs* outputs = live.exchange(nullptr);
-        if (!outputs || outputs->moving_) continue;
-        outputs->work_.remove();
-        any = true;
-    }
-    return any;
+void Outputs::commit(std::span<Outputs* const> all) {
+    if (all.empty()) return;
+    for (Outputs* const one : all) one->plan();
+    const Outputs& first = *all.front();
+    const auto result = first.transaction_->commit(first.policy_.overwrite, first.policy_.sync);
+    if (!result.synced)
+        throw failure(Msg::outputNotSynced, {first.output_.string(), std::strerror(result.moved.error)});
+    if (result.moved.error != 0) first.notPlaced(result.moved, result.place->folder);
+    first.transaction_->discard();
 }

@@ -28,12 +28,14 @@ class SetPlacement {
     // Moves the files. After a failure the old ones stand again, unless it is torn. Takes no
     // memory.
     PlaceResult run();
+    // After run: the old files stand again, and nothing is new. False if one could not be moved; then it is
+    // torn. Takes no memory.
+    bool takeBack();
 
   private:
     PlaceResult moveOldIn();
     PlaceResult moveNewOut();
     int enter(const char* from, const char* to);
-    bool takeBack();
 
     int work_, place_;
     const Manifest& set_;

@@ -1,5 +1,7 @@
 #include "tarsel/host/outputs/streamoutput.h"
 
+#include <cerrno>
+#include <charconv>
 #include <filesystem>
 
 #include <fcntl.h>
@@ -7,6 +9,7 @@
 #include <sys/sysmacros.h>
 #include <unistd.h>
 
+#include "tarsel/host/outputs/descriptor.h"
 #include "tarsel/words/messages.h"
 
 namespace fs = std::filesystem;
@@ -14,6 +17,7 @@ namespace fs = std::filesystem;
 namespace {
 
 constexpr const char* kStandard = "/dev/stdout";
+constexpr std::string_view kDescriptors[] = {"/dev/fd/", "/proc/self/fd/"};
 
 bool isNullDevice(const struct stat& facts) {
     return S_ISCHR(facts.st_mode) && major(facts.st_rdev) == 1 && minor(facts.st_rdev) == 3;
@@ -24,10 +28,24 @@ bool sameFile(const std::string& first, const std::string& second) {
     return fs::is_regular_file(second, error) && fs::equivalent(first, second, error);
 }
 
+// The number in a name of one of this process's descriptors; -1 for other names.
+int descriptorOf(const std::string& name) {
+    if (name == kStandard) return STDOUT_FILENO;
+    if (name == "/dev/stderr") return STDERR_FILENO;
+    for (const std::string_view start : kDescriptors) {
+        if (name.rfind(start, 0) != 0) continue;
+        int number = -1;
+        const char* const last = name.data() + name.size();
+        const auto [end, error] = std::from_chars(name.data() + start.size(), last, number);
+        if (error == std::errc() && end == last) return number;
+    }
+    return -1;
+}
+
 }  // namespace
 
 bool StreamOutput::namesDescriptor(const std::string& name) {
-    for (const char* start : {"/dev/fd/", "/proc/self/fd/"})
+    for (const std::string_view start : kDescriptors)
         if (name.rfind(start, 0) == 0) return true;
     return name == kStandard || name == "/dev/stderr" || name == "/dev/stdin";
 }
@@ -49,6 +67,7 @@ std::unique_ptr<StreamOutput> StreamOutput::find(const std::string& output,
                (S_ISREG(facts.st_mode) && !namesDescriptor(name))) {
         return nullptr;
     }
+    if (S_ISSOCK(facts.st_mode) && !namesDescriptor(name)) throw failure(Msg::streamIsSocket, {output});
     for (const auto& input : inputs)
         if (sameFile(input, name)) throw failure(Msg::outputIsInput, {output});
     found.discards_ = isNullDevice(facts);
@@ -56,6 +75,26 @@ std::unique_ptr<StreamOutput> StreamOutput::find(const std::string& output,
 }
 
 std::string StreamOutput::engineName() const { return name_ == "-" ? kStandard : name_; }
+
+std::string StreamOutput::place() const {
+    std::error_code error;
+    return fs::weakly_canonical(engineName(), error).string();
+}
+
+int StreamOutput::write(std::string_view bytes) const {
+    // What the shell has opened is written where it stands.
+    const int own = descriptorOf(engineName());
+    const Descriptor output(own >= 0 ? fcntl(own, F_DUPFD_CLOEXEC, 0)
+                                     : open(name_.c_str(), O_WRONLY | O_NOCTTY | O_CLOEXEC));
+    if (!output) return errno;
+    while (!bytes.empty()) {
+        const ssize_t taken = ::write(output.get(), bytes.data(), bytes.size());
+        if (taken < 0 && errno == EINTR) continue;
+        if (taken <= 0) return taken < 0 ? errno : ENOSPC;
+        bytes.remove_prefix(static_cast<size_t>(taken));
+    }
+    return 0;
+}
 
 std::string StreamOutput::withUserName(std::string text) const {
     const std::string engine = engineName();

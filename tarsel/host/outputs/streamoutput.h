@@ -4,6 +4,7 @@
 
 #include <memory>
 #include <string>
+#include <string_view>
 #include <vector>
 
 class StreamOutput {
@@ -20,9 +21,13 @@ class StreamOutput {
     const std::string& name() const { return name_; }
     // For the multiplexer.
     std::string engineName() const;
+    // The place that it stands for, in a form by which places can be compared.
+    std::string place() const;
     bool isStandardOutput() const { return standard_; }
     // The null device: takes anything, even several streams, and keeps nothing.
     bool discards() const { return discards_; }
+    // Opens it, waits for a reader where it needs one, and writes all of `bytes`. 0 or an errno.
+    int write(std::string_view bytes) const;
     // A message of the engine with the user's name in it.
     std::string withUserName(std::string text) const;
 

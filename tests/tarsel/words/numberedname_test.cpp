@@ -30,7 +30,7 @@ TEST(NumberedNames, NumbersHaveTheirPlaceAndNoOtherFileMatches) {
         ASSERT_TRUE(name) << row.name;
         EXPECT_EQ(name->at(row.number), row.made);
         EXPECT_EQ(name->plain(".wav"), row.sound);
-        EXPECT_TRUE(name->matches(row.made)) << row.made;
+        EXPECT_EQ(name->numberOf(row.made), row.number) << row.made;
         EXPECT_FALSE(name->matches(row.other)) << row.other;
     }
     EXPECT_EQ(NumberedName::parse("c_%d.yuv")->at(1, ".wav"), "c_1.wav");

@@ -3,8 +3,15 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
+#include <atomic>
 #include <map>
+#include <set>
 #include <span>
+#include <thread>
+
+#include <sched.h>
+#include <sys/stat.h>
 
 #include "tarsel/host/outputs/recovery.h"
 #include "tarsel/words/failure.h"
@@ -83,6 +90,12 @@ const Job kJobs[] = {
      {{"c0.yuv", "0"}, {"c2.yuv", "2"}, {"c2.wav", "2"}, {"c2.png", "b"}, {"cx.yuv", "b"}},
      {{"out#00.raw", "n0"}, {"out#01.raw", "n1"}, {"out.wav", "s"}},
      {{"c0.yuv", "n0"}, {"c1.yuv", "n1"}, {"c0.wav", "s"}, {"c2.png", "b"}, {"cx.yuv", "b"}}},
+    {"frames beside a sound that is not theirs",
+     "a.yuv",
+     "raw",
+     {{"a.yuv", "old"}, {"a.wav", "s"}},
+     {{"out.raw", "new"}},
+     {{"a.yuv", "new"}, {"a.wav", "s"}}},
     {"fewer channels",
      "a.wav",
      "wav",
@@ -130,7 +143,7 @@ class OutputsTest : public testing::Test {
             if (const auto numbered = NumberedName::parse(job.output)) outputs.number(*numbered);
             const fs::path work = fs::path(outputs.begin(job.extension)).parent_path();
             for (const auto& [name, bytes] : job.written) std::ofstream(work / name) << bytes;
-            outputs.commit(job.extension);
+            outputs.commit();
             return 0;
         } catch (const Failure& failure) {
             return static_cast<int>(failure.exit());
@@ -205,7 +218,10 @@ TEST_F(OutputsTest, WhatTheDiskDoesNotTakeLeavesTheOld) {
                     failCalls({call}, error);
                     return run(job);
                 });
-                const bool single = job.written.size() == 1 && job.before.size() <= 1;
+                const bool single = job.written.size() == 1 &&
+                                    std::all_of(job.before.begin(), job.before.end(), [&](const auto& file) {
+                                        return job.after.count(file.first);
+                                    });
                 const bool used =
                     call == SYS_fsync || call == SYS_renameat2 || (call == SYS_fdatasync) == single;
                 // A file system that knows no synchronisation has nothing to fail.
@@ -213,6 +229,132 @@ TEST_F(OutputsTest, WhatTheDiskDoesNotTakeLeavesTheOld) {
                 EXPECT_EQ(status, used && !harmless ? 4 : 0) << job.what << call << ", " << error;
                 EXPECT_EQ(found(), status == 0 ? job.after : job.before) << job.what << call << ", " << error;
             }
+}
+
+// Outputs of one job in two folders, the second of which gets one of them.
+class Together : public OutputsTest {
+  protected:
+    static constexpr const char* kNames[] = {"a.yuv", "a.wav", "dump", "sub/task.xml"};
+
+    void fill(bool old) const {
+        OutputsTest::fill({});
+        fs::create_directory(folder.file("sub"));
+        for (const char* name : kNames)
+            if (old) folder.write(name, "old");
+    }
+    static int run() {
+        try {
+            const auto files = std::make_shared<Transaction>();
+            Outputs set("a.yuv", "-o", {}, policy(), files), dump("dump", "--filter", {}, policy(), files),
+                task("sub/task.xml", "--save-task", {}, policy(), files);
+            set.expectSet();
+            const fs::path work = fs::path(set.begin("raw")).parent_path();
+            std::ofstream(work / "out.raw") << "new";
+            std::ofstream(work / "out.wav") << "new";
+            std::ofstream(dump.begin("")) << "new";
+            std::ofstream(task.begin("xml")) << "new";
+            Outputs* const all[] = {&set, &dump, &task};
+            Outputs::commit(all);
+            return 0;
+        } catch (const Failure& failure) {
+            return static_cast<int>(failure.exit());
+        }
+    }
+    // What the files of a folder hold: "old", "new", or a mixture.
+    std::string state(const std::string& where) const {
+        std::set<std::string> found;
+        for (const std::string name : kNames)
+            if ((name.rfind("sub/", 0) == 0) == (where == "sub"))
+                found.insert(fs::exists(folder.file(name)) ? TempFolder::read(folder.file(name)) : "none");
+        return found.size() == 1 ? *found.begin() : "a mixture";
+    }
+    bool littered() const {
+        for (const auto& entry : fs::recursive_directory_iterator(folder.path()))
+            if (entry.path().filename().string().rfind(".tarsel", 0) == 0) return true;
+        return false;
+    }
+    void recoverAll() const {
+        for (const char* place : {"", "sub"})
+            for (const auto& left : recoverPlace(folder.file(place), {})) EXPECT_FALSE(left.remains());
+    }
+};
+
+TEST_F(Together, AKillLeavesNoMixtureInAFolder) {
+    for (const bool old : {false, true}) {
+        const std::string before = old ? "old" : "none";
+        std::set<std::string> seen;
+        for (int n = 1;; ++n) {
+            fill(old);
+            if (!killedBefore(n, [] { return run(); })) break;
+            recoverAll();
+            for (const char* where : {"", "sub"}) {
+                EXPECT_TRUE(state(where) == before || state(where) == "new") << where << n << state(where);
+                seen.insert(state(where));
+            }
+            EXPECT_FALSE(littered()) << n;
+        }
+        EXPECT_EQ(seen, (std::set<std::string>{before, "new"}));
+    }
+}
+
+#ifdef __x86_64__
+TEST_F(Together, OneCallThatFailsTakesAllFoldersBack) {
+    for (const long call : {SYS_fsync, SYS_renameat2, SYS_syncfs}) {
+        int calls = 0;
+        for (int n = 1;; ++n, ++calls) {
+            fill(true);
+            const int status = withFailure(call, n, EIO, [] { return run(); });
+            if (status < 0) break;
+            EXPECT_EQ(status, 4) << call << ", " << n;
+            EXPECT_EQ(state("") + state("sub"), "oldold") << call << ", " << n;
+            EXPECT_FALSE(littered()) << call << ", " << n;
+        }
+        EXPECT_GE(calls, 2) << call;
+    }
+}
+#endif
+
+// What ends the process may come at any moment of a placement.
+TEST_F(Together, AnEndMeetsNoHalfPlacement) {
+    for (int round = 0; round < 300; ++round) {
+        fill(true);
+        inChild([&] {
+            std::atomic<bool> begun{false};
+            std::thread placing([&] {
+                begun = true;
+                run();
+            });
+            placing.detach();
+            while (!begun) sched_yield();
+            for (int i = 0; i < round * 20; ++i) begun = true;
+            Transaction::abandonAll();
+            return 0;
+        });
+        recoverAll();
+        for (const char* where : {"", "sub"})
+            EXPECT_TRUE(state(where) == "old" || state(where) == "new") << round << where << state(where);
+        EXPECT_FALSE(littered()) << round;
+    }
+}
+
+// What can't be known of the old file's list is not given away.
+TEST_F(OutputsTest, AListThatCanNotBeReadCountsAsLost) {
+    const struct {
+        int error;
+        mode_t mode;
+    } cases[] = {{ENODATA, 0664}, {ENOTSUP, 0664}, {ENOENT, 0644}, {EACCES, 0644}};
+    for (const auto& c : cases) {
+        fill({{"a.wav", "old"}});
+        ASSERT_EQ(chmod(folder.file("a.wav").c_str(), 0664), 0);
+        EXPECT_EQ(inChild([&] {
+                      failCalls({SYS_getxattr}, c.error);
+                      return run(kJobs[1]);
+                  }),
+                  0);
+        struct stat status {};
+        ASSERT_EQ(stat(folder.file("a.wav").c_str(), &status), 0);
+        EXPECT_EQ(status.st_mode & 07777u, c.mode) << c.error;
+    }
 }
 
 #ifdef __x86_64__
