@@ -61,7 +61,7 @@ def attack(sweep, job, call, nth, way, trace=False):
         report = pathlib.Path(box.root / "report").read_text()
         if kind == "rename" and ever and crashed(outcome) is None and box.litter():
             # Not even the way back can be taken: as after a kill, nothing is mixed, and the next run completes it.
-            wrong = kills.mixed(box.files(), sweep.old[job.name], sweep.new[job.name], job.loose)
+            wrong = kills.mixed(box.files(), sweep.old[job.name], sweep.new[job.name])
             wrong = wrong or kills.after(box, sweep, job, "again") or wording(outcome)
         else:
             wrong = judged(box, outcome, job)

@@ -13,7 +13,6 @@ class Job:
     name: str
     arguments: list
     earlier: list = dataclasses.field(default_factory=list)
-    loose: tuple = ()  # files that are written before the outputs: whole, but on their own
     stdout: bool = False  # the result is what is printed
 
 
@@ -41,7 +40,11 @@ JOBS = [
     Job("effects", ["transcode", *CLIP, *EFFECTS, "-o", "burnt.yuv", "-y"],
         ["transcode", *CLIP, "-o", "burnt.yuv", "-y"]),
     Job("task", ["transcode", "in.wav", "-o", "out.wav", "--save-task", "task.xml", "-y"],
-        ["transcode", "in3.wav", "-o", "out.wav", "--save-task", "task.xml", "-y"], loose=("task.xml",)),
+        ["transcode", "in3.wav", "-o", "out.wav", "--save-task", "task.xml", "-y"]),
+    Job("dump", card("--pixel", "I420", "--filter", "rawdump:filename=dump", "-o", "dumped.yuv"),
+        card("--pixel", "I420", "--filter", "rawdump:filename=dump", "-o", "dumped.yuv", length=0.28)),
+    Job("logo", card("--logo", "shown#9.png@4,4", "--save-task", "shown.xml", "-o", "shown.png"),
+        card("--logo", "shown#9.png@0,0", "--save-task", "shown.xml", "-o", "shown.png", length=0.28, size="48x64")),
     Job("captions", ["captions", "one.scc", "--json"], stdout=True),
     Job("info", ["info", "in.wav", "talk.srt", "--json"], stdout=True),
 ]
@@ -74,4 +77,5 @@ SCC = (b"Scenarist_SCC V1.0\n\n"
 
 def inputs():
     return {"in.wav": wav(pattern(12000)), "in3.wav": wav(pattern(9000, 11), channels=3),
-            "clip.yuv": pattern(64 * 48 * 3 // 2 * 20), "mark.png": png(20, 10), "talk.srt": SRT, "one.scc": SCC}
+            "clip.yuv": pattern(64 * 48 * 3 // 2 * 20), "mark.png": png(20, 10),
+            "shown#9.png": png(12, 12), "talk.srt": SRT, "one.scc": SCC}

@@ -21,14 +21,12 @@ def traced(box, sweep, job, number):
                    wrap=[sweep.killat, box.root / "report", number])
 
 
-def mixed(files, old, new, loose):
+def mixed(files, old, new):
     """What is wrong with the files right after the kill."""
-    named = {name: data for name, data in files.items() if name not in loose}
-    parts = [all(side.get(name) == data for name, data in named.items()) for side in (old, new)]
+    parts = [all(side.get(name) == data for name, data in files.items()) for side in (old, new)]
     if not any(parts):
-        return difference(files, old, new, loose) or "mixed"
-    whole = len(new) - len(loose) == 1
-    if whole and not named and old:
+        return difference(files, old, new) or "mixed"
+    if len(new) == 1 and not files and old:
         return "absent: there is neither the old nor the new file"
     return None
 
@@ -45,7 +43,7 @@ def after(box, sweep, job, way):
         outcome = box.run(["transcode", "in3.wav", "-o", "other.wav"])
         (box.work / "other.wav").unlink(missing_ok=True)
     wrong = crashed(outcome) or (f"`{way}` fails: {outcome.text.strip()}" if outcome.status else None)
-    wrong = wrong or difference(box.files(), old, new, job.loose)
+    wrong = wrong or difference(box.files(), old, new)
     return wrong or (f"leaves {', '.join(box.litter())}" if box.litter() else None)
 
 
@@ -55,7 +53,7 @@ def attack(sweep, job, number):
         box.lay(sweep.old[job.name])
         outcome = traced(box, sweep, job, number)
         wrong = outcome.status not in (137, 0) and (crashed(outcome) or f"ends with {outcome.status}")
-        wrong = wrong or mixed(box.files(), sweep.old[job.name], sweep.new[job.name], job.loose)
+        wrong = wrong or mixed(box.files(), sweep.old[job.name], sweep.new[job.name])
         if not wrong:
             wrong = after(box, sweep, job, way)
             wrong = wrong and f"after the kill, then `{way}`: {wrong}"

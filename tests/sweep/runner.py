@@ -79,7 +79,7 @@ class Box:
 
     def files(self):
         """What is in the working folder besides the inputs and hidden folders: name and content."""
-        found = {}
+        found = {f"the input {name}": b"gone" for name in self.sweep.inputs if not (self.work / name).exists()}
         for path in sorted(self.work.rglob("*")):
             name = str(path.relative_to(self.work))
             if path.is_file() and not path.is_symlink() and not name.startswith(".tarsel"):
@@ -113,12 +113,8 @@ def wording(outcome):
     return None
 
 
-def difference(files, old, new, loose=()):
+def difference(files, old, new):
     """How files are neither all old nor all new."""
-    for name in loose:
-        if files.get(name) not in (None, old.get(name), new.get(name)):
-            return f"{name} is torn"
-    old, new, files = ({k: v for k, v in files_.items() if k not in loose} for files_ in (old, new, files))
     if files in (old, new):
         return None
     kinds = {name: "new" if name in new and data == new[name] else "old" if name in old and data == old[name] else
@@ -135,10 +131,10 @@ def judged(box, outcome, job, litter=True):
         return wrong
     files = box.files()
     if outcome.status == 0:
-        if difference(files, new, new, job.loose) or (job.stdout and outcome.stdout != box.sweep.stdout[job.name]):
-            return "status 0, but " + (difference(files, old, new, job.loose) or "the result is not the right one")
+        if difference(files, new, new) or (job.stdout and outcome.stdout != box.sweep.stdout[job.name]):
+            return "status 0, but " + (difference(files, old, new) or "the result is not the right one")
     else:
-        wrong = difference(files, old, new, job.loose)
+        wrong = difference(files, old, new)
         if wrong:
             return f"fails (status {outcome.status}) and leaves what is {wrong}"
     if litter and box.litter():
