@@ -2,6 +2,7 @@
 #pragma once
 
 #include <atomic>
+#include <memory>
 
 #include "core/arch/api.h"
 
@@ -38,4 +39,13 @@ class QV_API QvCancel {
     std::atomic<long long> at_{0};  // instant of the request, 0: none
     std::atomic<int> descriptor_{-1};
     std::atomic<bool> gaveUp_{false};
+};
+
+// What writes an output of its own beside those of the encode pipe, such as a filter that stores frames. A
+// codec that derives from it as well is given the run's QvCancel by TransVLink, before it is opened.
+class QV_API QvCancellable {
+  public:
+    virtual ~QvCancellable();
+    // Null: nothing ends a wait.
+    virtual void setCancel(std::shared_ptr<QvCancel> cancel) = 0;
 };

@@ -3,6 +3,7 @@
 #include <utility>
 
 #include "core/arch/qvassert.h"
+#include "core/arch/qvcancel.h"
 #include "core/engine/log/qvlog.h"
 #include "core/engine/modules/qvregistry.h"
 #include "core/engine/qvutil.h"
@@ -188,7 +189,9 @@ void VideoChain::planCustom() {
 }
 
 void VideoChain::append(QvVProcessPipe& pipe, VideoFilterPtr filter) const {
-    if (filter) pipe.addFilter(filter.release(), -1);
+    if (!filter) return;
+    if (auto* writer = dynamic_cast<QvCancellable*>(filter.get())) writer->setCancel(job_.cancel);
+    pipe.addFilter(filter.release(), -1);
 }
 
 void VideoChain::fill(QvVProcessPipe& pipe) {

@@ -1,8 +1,12 @@
 // What one video or audio conversion has to do, from the format of a decoder stream to that of an encoder.
 #pragma once
 
+#include <memory>
+
 #include "core/measure/qvgeometry.h"
 #include "core/value/anycontainer.h"
+
+class QvCancel;
 
 struct VideoJobDescription {
     int inWidth = 0;  // pixels
@@ -21,6 +25,8 @@ struct VideoJobDescription {
     double outFrameAspect = 1.0;
     int topBlankingLines = 0;  // lines of blanking that the encoder wants on top
     AnyDict filters;           // a FiltersState
+    // For filters that are a QvCancellable; null for none.
+    std::shared_ptr<QvCancel> cancel;
 };
 
 struct AudioJobDescription {

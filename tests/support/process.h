@@ -63,6 +63,7 @@ class Process {
     Process& operator=(const Process&) = delete;
 
     void signal(int number) const { kill(pid_, number); }
+    pid_t id() const { return pid_; }
     void type(const std::string& keys) const {
         if (write(streams_[0].fd, keys.data(), keys.size()) < 0) std::abort();
     }

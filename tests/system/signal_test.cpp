@@ -2,6 +2,9 @@
 #include <sched.h>
 #include <sys/stat.h>
 
+#include <chrono>
+#include <fstream>
+
 #include "tests/system/tool.h"
 
 namespace {
@@ -16,6 +19,31 @@ class Signal : public Tool {
     int openPipe() const {
         mkfifo(folder.file("pipe.raw").c_str(), 0600);
         return open(folder.file("pipe.raw").c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
+    }
+    // Whether this signal is one of a set that the system shows of a process, as "SigBlk".
+    static bool isIn(const char* set, pid_t process, int signal) {
+        std::ifstream status("/proc/" + std::to_string(process) + "/status");
+        for (std::string line; std::getline(status, line);)
+            if (line.rfind(std::string(set) + ":", 0) == 0)
+                return (std::stoull(line.substr(7), nullptr, 16) >> (signal - 1)) & 1;
+        return false;
+    }
+    // Whether signals are handled and the main thread waits, as far as the system tells.
+    static bool waits(pid_t process) {
+        if (!isIn("SigBlk", process, SIGTERM)) return false;
+        std::string where;
+        std::ifstream stream("/proc/" + std::to_string(process) + "/wchan");
+        std::getline(stream, where);
+        for (const char* known : {"partner", "poll", "futex"})
+            if (where.find(known) != std::string::npos) return true;
+        return geteuid() != 0 && where == "0";
+    }
+    template <class Condition>
+    static bool comes(Condition condition) {
+        const auto last = std::chrono::steady_clock::now() + std::chrono::milliseconds(Process::kPatience);
+        while (!condition())
+            if (std::chrono::steady_clock::now() > last || sched_yield() != 0) return false;
+        return true;
     }
     static bool hasData(int reader) {
         pollfd data{reader, POLLIN, 0};
@@ -45,19 +73,73 @@ TEST_F(Signal, StopsAndLeavesWhatWasThere) {
     EXPECT_EQ(contents("out.raw"), "precious");
 }
 
-// The write of a filter's file is one that a stop waits for.
+// A full standard error, to which the job tells its progress, is what a stop waits for; the end waits for
+// nothing.
 TEST_F(Signal, TheSecondEndsAtOnce) {
-    const int reader = openPipe();
-    Process run(words({"transcode", "testgen:size=1280x720,rate=25,duration=2,audio=0", "-o", "out.raw",
-                       "--filter", "rawdump:filename=pipe.raw"}),
-                here());
-    ASSERT_TRUE(hasData(reader));
-    run.signal(SIGINT);
-    ASSERT_TRUE(run.waitFor("tarsel: stopping"));
-    run.signal(SIGINT);
+    int full[2];
+    ASSERT_EQ(pipe2(full, 0), 0);
+    fcntl(full[1], F_SETFL, O_NONBLOCK);
+    const std::string page(4096, '.');
+    while (write(full[1], page.data(), page.size()) > 0) {
+    }
+    fcntl(full[1], F_SETFL, 0);
+    const std::string line =
+        "exec '" + program() + "' transcode " + kEndless +
+        " -o out.raw --save-task t.xml --filter rawdump:filename=dump --progress json 2>&" +
+        std::to_string(full[1]);
+    Process run({"sh", "-c", line}, here());
+    ASSERT_TRUE(comes([&] { return listing().size() >= 2; }));
+    for (int i = 0; i < 2; ++i) {
+        run.signal(SIGINT);
+        EXPECT_TRUE(comes([&] { return !isIn("ShdPnd", run.id(), SIGINT); }));
+    }
     EXPECT_EQ(run.finish().status, 130);
-    EXPECT_EQ(listing(), std::set<std::string>{"pipe.raw"});
-    close(reader);
+    EXPECT_EQ(listing(), std::set<std::string>());
+    close(full[0]);
+    close(full[1]);
+}
+
+TEST_F(Signal, TheSecondEndsTheCommandOfPost) {
+    Process run(words({"transcode", "testgen:size=64x64,duration=0.1,audio=0", "-o", "out.raw", "--post",
+                       "trap '' INT; echo started; while :; do sleep 1; done"}),
+                here());
+    ASSERT_TRUE(run.waitFor("started"));
+    run.signal(SIGINT);
+    EXPECT_TRUE(comes([&] { return !isIn("ShdPnd", run.id(), SIGINT); }));
+    run.signal(SIGINT);
+    const Outcome o = run.finish();
+    EXPECT_EQ(o.status, 130);
+    EXPECT_THAT(o.err, testing::HasSubstr("ended the command of --post; 'out.raw' is complete\n"));
+}
+
+// A pipe that nobody has opened, or that nobody reads, holds nothing up, whatever it is for.
+TEST_F(Signal, TheFirstEndsTheWaitForAReader) {
+    folder.write("t.srt", "1\n00:00:00,000 --> 00:00:01,000\nHello\n");
+    std::filesystem::create_directory(folder.file("tmp"));
+    const Words job{"transcode", "testgen:size=1280x720,rate=25,duration=2,audio=0", "-o", "out.raw", "-q"};
+    const Words rows[] = {
+        job + Words{"--filter", "rawdump:filename=pipe.raw"},
+        job + Words{"--save-task", "pipe.raw"},
+        {"captions", "t.srt", "--vtt", "-o", "pipe.raw"},
+    };
+    ProcessOptions options = here();
+    options.environment = {"TMPDIR=" + folder.file("tmp")};
+    for (const auto& row : rows)
+        for (const bool opened : {false, true}) {
+            // What fits into the pipe does not wait.
+            if (opened && row.back().rfind("rawdump", 0) != 0) continue;
+            SCOPED_TRACE(testing::PrintToString(row) + (opened ? " opened" : ""));
+            const int reader = openPipe();
+            if (!opened) close(reader);
+            Process run(words(row), options);
+            EXPECT_TRUE(opened ? hasData(reader) : comes([&] { return waits(run.id()); }));
+            run.signal(SIGTERM);
+            const Outcome o = run.finish();
+            EXPECT_EQ(o.status, 143) << o.err;
+            EXPECT_THAT(o.err, testing::HasSubstr("tarsel: stopped"));
+            EXPECT_EQ(listing(), (std::set<std::string>{"pipe.raw", "t.srt", "tmp"}));
+            if (opened) close(reader);
+        }
 }
 
 TEST_F(Signal, AReaderThatGoesIsAnError) {
@@ -101,6 +183,24 @@ TEST_F(Signal, OnRequestALineOfTheState) {
     EXPECT_EQ(o.status, 143);
     EXPECT_THAT(o.err, testing::ContainsRegex("tarsel: +[0-9.]+ %  frame [0-9]+  [0-9.]+x.*  running\n"));
     close(reader);
+}
+
+TEST_F(Signal, OnRequestTheStateOfPost) {
+    const Words job{"transcode",
+                    "testgen:size=64x64,duration=0.1,audio=0",
+                    "-o",
+                    "out.raw",
+                    "-y",
+                    "--post",
+                    "echo started; exec sleep 1000"};
+    for (const bool json : {false, true}) {
+        Process run(words(job + (json ? Words{"--progress", "json"} : Words{})), here());
+        ASSERT_TRUE(run.waitFor("started"));
+        run.signal(SIGUSR1);
+        EXPECT_TRUE(run.waitFor(json ? "\"state\":\"post\"}" : "tarsel: the command of --post is running\n"));
+        run.signal(SIGTERM);
+        EXPECT_EQ(run.finish().status, 143);
+    }
 }
 
 TEST_F(Signal, ReachesTheCommandOfPost) {

@@ -27,7 +27,9 @@ int DumpRaw::open() {
     const std::string& name = settings_.filename;
     file_.reset();
     failed_ = false;
-    if (name != DumpRawSettings().filename) file_.reset(qv_platform().openFile(name.c_str(), "wb"));
+    bool isStream = false;
+    if (name != DumpRawSettings().filename)
+        file_.reset(qv_platform().openOutput(name.c_str(), cancel_, isStream));
     if (file_) {
         // A frame is written as a whole: what fails is told with the frame and not later.
         std::setvbuf(file_.get(), nullptr, _IONBF, 0);

@@ -5,20 +5,23 @@
 //
 // The file holds the planes of the frames, one after the other, as they stand in memory, with what pads their
 // rows. Frames pass unchanged, also when the file can't be written: then that write or apply returns -1 with
-// a line in the user log, nothing more is written, and close returns -1. Works in place.
+// a line in the user log, nothing more is written, and close returns -1. Works in place. What is no file,
+// such as a pipe, is written from where it stands, and a stop of the run ends the wait for its reader.
 #pragma once
 
 #include <cstdio>
 #include <memory>
 #include <string>
+#include <utility>
 
 #include "builtin/video/inplaceeffect.h"
+#include "core/arch/qvcancel.h"
 
 struct DumpRawSettings {
     std::string filename = "set me";
 };
 
-class DumpRaw : public InPlaceEffectOf<DumpRawSettings> {
+class DumpRaw : public InPlaceEffectOf<DumpRawSettings>, public QvCancellable {
   public:
     DumpRaw();
     void getParam(const char* name, Any& value) const override;
@@ -26,6 +29,7 @@ class DumpRaw : public InPlaceEffectOf<DumpRawSettings> {
     int close() override;
     int write(QvFrame& frame) override;
     int apply(QvFrame& frame) override;
+    void setCancel(std::shared_ptr<QvCancel> cancel) override { cancel_ = std::move(cancel); }
 
     using InPlaceEffectOf::getParam;
 
@@ -41,5 +45,6 @@ class DumpRaw : public InPlaceEffectOf<DumpRawSettings> {
     int writeFailed();
 
     std::unique_ptr<std::FILE, CloseFile> file_;
+    std::shared_ptr<QvCancel> cancel_;
     bool failed_ = false;
 };

@@ -7,6 +7,8 @@
 
 #include "core/arch/platform.h"
 
+QvCancellable::~QvCancellable() = default;
+
 QvCancel::~QvCancel() {
     if (const int descriptor = descriptor_.load(); descriptor >= 0) close(descriptor);
 }

@@ -8,6 +8,7 @@
 
 #include <initializer_list>
 #include <memory>
+#include <utility>
 #include <vector>
 
 #include "core/arch/api.h"
@@ -139,6 +140,9 @@ class QV_API TransVLink : public TransLink {
     QvDecodePipe* metaSource(int index) const override;
     int metaSourceStreamNr(int index) const override;
 
+    // Ends the waits of filters that are a QvCancellable; in force from the next open on. Null: nothing does.
+    void setCancel(std::shared_ptr<QvCancel> cancel) { cancel_ = std::move(cancel); }
+
     const QvFramerate& outFramerate() const { return outFramerate_; }
     int nrFramesIn() const { return nrFramesIn_; }
     int startFrame() const { return startFrame_; }
@@ -186,6 +190,7 @@ class QV_API TransVLink : public TransLink {
     int encViews_ = 1;
     std::vector<std::unique_ptr<MetaVHelper>> metaSources_;
     VideoJobDescription job_;  // of the pipe, which may keep a pointer to it
+    std::shared_ptr<QvCancel> cancel_;
 };
 
 class QV_API TransALink : public TransLink {

@@ -165,6 +165,7 @@ void TransVLink::describeJob(const AnyDict* params, const AnyDict& stream) {
     job_.inFrameAspect = stream.getDouble("frameAspect", 1.0);
     job_.inWidth = stream.getInt32("width", 0);
     job_.inHeight = stream.getInt32("height", 0);
+    job_.cancel = cancel_;
     job_.startFrame = startFrame_;
     job_.stopFrame = stopFrame_;
     const Any blanking = encoder_->getParam(_encPar("_needTopBlanking").asString());

@@ -98,6 +98,7 @@ int QvTranscodeRun::openLinks() {
     for (int i = 0; i < links.size(); ++i) {
         TransLink& link = *links.at(i);
         int result = QvStatus::failed;
+        if (auto* video = dynamic_cast<TransVLink*>(&link)) video->setCancel(p_.cancel);
         try {
             result = link.open(&params.at(i).asDict());
         } catch (const QvAssertFailure&) {
