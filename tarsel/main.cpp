@@ -17,6 +17,7 @@
 #include "tarsel/host/signals.h"
 #include "tarsel/host/terminal.h"
 #include "tarsel/words/commandline.h"
+#include "tarsel/words/fixedline.h"
 #include "tarsel/words/messages.h"
 
 namespace {
@@ -93,28 +94,27 @@ int run(int argc, char** argv) {
         flushOutput();
         return status(Exit::done);
     }
+    if (!log.empty() && log != "stderr") requireOwnLog(log, {argv + 1, argv + argc});
     Engine engine(log, plugins, allowUnsafePlugins);
     parsed.action();
     flushOutput();
     return status(Exit::done);
 }
 
-// Where memory is so short that not even the way out has enough, nothing half-done may stay behind.
+// Where memory is so short that not even the way out has enough, nothing half-done may stay.
 [[noreturn]] void breakOff() {
     blameLoadingPlugin("an exception left its start");
     // The result has its name; what could not be put away changes nothing.
     if (Signals::isComplete()) leave(status(Exit::done));
-    const bool abandoned = Transaction::abandonAll();
-    const char* reason = MemoryWatch(0).ranOut() ? "tarsel: out of memory" : "tarsel: an internal error";
+    Transaction::abandonAll();
+    Msg reason = MemoryWatch(0).ranOut() ? Msg::outOfMemory : Msg::engineFailed;
     try {
         if (std::current_exception()) throw;
     } catch (const std::bad_alloc&) {
-        reason = "tarsel: out of memory";
+        reason = Msg::outOfMemory;
     } catch (...) {
     }
-    const bool told =
-        writeToStderr(reason) && writeToStderr(abandoned ? "; nothing was left behind\n" : "\n");
-    leave(status(told ? Exit::failed : Exit::output));
+    leave(status(writeToStderr(FixedLine(reason).text()) ? Exit::failed : Exit::output));
 }
 
 }  // namespace

@@ -89,8 +89,7 @@ int RawAviMux::describeVideo(const QvCodec& encoder, AviInterleaver::Source& sou
     auto picture = AviPicture::of(type, width, height);
     if (!picture)
         return setError(QvStatus::failed,
-                        "AVI holds no pictures of the type '%s' at %dx%d; it takes BGR3, BGR4, I420, YV12, "
-                        "YUYV, UYVY and v210",
+                        "AVI takes no %s of %dx%d, but BGR3, BGR4, I420, YV12, YUYV, UYVY and v210",
                         qvFourccText(type).data(), width, height);
     const Any rate = encoder.getParam("framerate");
     const QvRatio ratio = rate.isFramerate() ? rate.asFramerate().rate() : QvRatio(0, 1);

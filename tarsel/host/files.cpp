@@ -1,5 +1,6 @@
 #include "tarsel/host/files.h"
 
+#include <algorithm>
 #include <cerrno>
 #include <cstdio>
 #include <filesystem>
@@ -40,6 +41,31 @@ void requireLog(const std::string& name) {
     FILE* file = std::fopen(name.c_str(), "ab");
     if (!file) throw systemFailure(Msg::logNotWritten, name, errno);
     std::fclose(file);
+}
+
+void requireOwnLog(const std::string& name, const std::vector<std::string>& words) {
+    if (isDevice(name)) return;
+    const auto check = [&](const std::string& other) {
+        std::error_code error;
+        // What is there already, and an output that will be.
+        const bool isFile = exists(other) || other.find_first_of("./") != std::string::npos;
+        if (isFile && (fs::equivalent(other, name, error) || samePlace(other, name)))
+            throw failure(Msg::logIsOther, {name, other});
+    };
+    bool isLogs = false;
+    for (const auto& word : words) {
+        const bool skip = isLogs || word.rfind("--log=", 0) == 0;
+        isLogs = word == "--log";
+        if (skip || word.empty()) continue;
+        check(word);
+        // FILE@X,Y and NAME:key=FILE,key=FILE
+        for (const char* ends : {"=", "=,", "@"})
+            for (size_t at = 0; at < word.size();) {
+                const size_t end = std::min(word.find_first_of(ends, at), word.size());
+                if (end > at) check(word.substr(at, end - at));
+                at = end + 1;
+            }
+    }
 }
 
 Failure failureOf(const std::system_error& error) {

@@ -3,6 +3,7 @@
 
 #include <string>
 #include <system_error>
+#include <vector>
 
 #include "tarsel/words/failure.h"
 
@@ -14,6 +15,9 @@ void requireInput(const std::string& name);
 
 // Throws Failure (output) if the engine's log can't be written to `name`, which may make the file.
 void requireLog(const std::string& name);
+// Throws Failure (output) if a log of this name would take the place of another file that the words of a
+// command line name, by themselves or within an option's value.
+void requireOwnLog(const std::string& name, const std::vector<std::string>& words);
 
 // What a call of the standard library ran into that nothing else has caught. Of a hidden work folder, the
 // folder that it is in is named.

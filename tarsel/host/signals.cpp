@@ -1,8 +1,6 @@
 #include "tarsel/host/signals.h"
 
-#include <algorithm>
 #include <atomic>
-#include <cstdio>
 #include <mutex>
 #include <system_error>
 
@@ -11,7 +9,7 @@
 #include <unistd.h>
 
 #include "tarsel/host/terminal.h"
-#include "tarsel/words/messages.h"
+#include "tarsel/words/fixedline.h"
 
 namespace {
 
@@ -48,13 +46,10 @@ bool succeeds(Handler handler) {
 
 // In one write, so that nothing stands in between.
 void tell(const Signals::Handlers& handlers) {
-    const char* text = !handlers.last.empty() ? handlers.last.c_str()
-                       : handlers.second      ? "stopped; nothing was left behind"
-                                              : "stopped";
-    char line[4096];
-    const int length = std::snprintf(line, sizeof line, "tarsel: %s\n", text);
-    const auto shown = std::min(static_cast<size_t>(std::max(length, 0)), sizeof line - 1);
-    if (stderrHasRoom()) writeToStderr({line, shown});
+    if (stderrHasRoom())
+        writeToStderr(FixedLine(handlers.last.value_or(handlers.second ? Msg::stoppedWithNothing : Msg::stopped),
+                                {handlers.file})
+                          .text());
 }
 
 }  // namespace

@@ -3,10 +3,12 @@
 #pragma once
 
 #include <functional>
+#include <optional>
 #include <string>
 #include <thread>
 
 #include "tarsel/words/failure.h"
+#include "tarsel/words/messages.h"
 
 class Signals {
   public:
@@ -17,9 +19,10 @@ class Signals {
         // if this answers that the work was complete, else with that of the signal.
         std::function<bool()> second;
         std::function<void()> report = {};  // on SIGUSR1, as often as it comes
-        // What is said when the process ends at once before the work is complete; "": that nothing was left
-        // behind, if there is a `second` to see to that.
-        std::string last = {};
+        // What is said when the process ends at once before the work is complete; without it that no output
+        // was written, if there is a `second` to see to that. `file`: the name in it.
+        std::optional<Msg> last = {};
+        std::string file = {};
     };
 
     // Blocks those of them that are not ignored in this thread and those started from now on. Make it before

@@ -122,7 +122,7 @@ void Job::chooseOutput() {
         kind_ = OutputKind::nothing;
         return;
     }
-    if (options_.output.empty()) throw Failure(Exit::usage, "no output; give its name with -o FILE");
+    if (options_.output.empty()) throw failure(Msg::outputMissing);
     stream_ = StreamOutput::find(options_.output, options_.inputs);
     kind_ = chosenKind();
     choosePixel();
@@ -353,8 +353,11 @@ void Job::addStream(JobStream& stream) {
     QvEncoder& encoder = *pipe_->encoder(stream.type, stream.encStream);
     if (stream.type == kVideo) {
         setChecked(encoder, "type", static_cast<int>(stream.fourcc), "--pixel");
-        setChecked(encoder, "width", stream.width, "--size");
-        setChecked(encoder, "height", stream.height, "--size");
+        for (const auto& [name, value] :
+             {std::pair{"width", stream.width}, std::pair{"height", stream.height}})
+            if (static_cast<QvCodec&>(encoder).setParam(name, value) != QvStatus::ok)
+                throw failure(Msg::frameTooLarge,
+                              {"--size", std::to_string(stream.width) + "x" + std::to_string(stream.height)});
         setChecked(encoder, "framerate", Any(stream.rate), "--rate");
     } else {
         setChecked(encoder, "samplerate", stream.samplerate, "--samplerate");
@@ -392,7 +395,10 @@ void Job::checkOutputNames() {
     pipe_->setFilename(Any(outputs_->hiddenName(primaryExtension()).c_str()));
     const Any names = pipe_->getMuxer()->QvCodec::getParam("filenames");
     for (int i = 0; names.isVector() && i < names.asVector().size(); ++i) {
-        const auto name = outputs_->finalName(names.asVector().at(i).asString(), primaryExtension());
+        const std::string written = names.asVector().at(i).asString();
+        // Pictures get numbers in place of this name, and those have been looked at.
+        if (kind_ == OutputKind::pictures && !written.ends_with(".wav")) continue;
+        const auto name = outputs_->finalName(written, primaryExtension());
         outputs_->checkFinal(name);
         if (!places_.insert(outputs_->placeOf(name)).second)
             throw failure(Msg::outputTwice, {name, "give -o the extension of its format"});

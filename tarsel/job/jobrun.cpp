@@ -15,7 +15,9 @@
 #include "tarsel/host/terminal.h"
 #include "tarsel/job/job.h"
 #include "tarsel/job/post.h"
+#include "tarsel/words/fixedline.h"
 #include "tarsel/words/messages.h"
+#include "tarsel/words/systemcause.h"
 #include "tarsel/words/timespec.h"
 
 // The transcoder of a job. Its callbacks run on the engine's worker; the tool waits on its own thread.
@@ -131,9 +133,12 @@ class Job::Runner : public QvTranscoder {
     }
 
     Failure failureOf(const QvCodec& filter) const {
-        const bool writes = !filterFile(filter, QV_GUI_FILESELECT_SAVE).empty();
-        return failure(writes ? Msg::filterWriteFailed : Msg::filterFailed,
-                       {filter.name(), job_.withFinalNames(filter.errorDesc())});
+        const std::string file = filterFile(filter, QV_GUI_FILESELECT_SAVE);
+        const auto cause = causeIn(filter.errorDesc());
+        if (!file.empty() && cause)
+            return failure(Msg::filterWriteFailed,
+                           {filter.name(), job_.withFinalNames(file), cause->why, cause->remedy});
+        return failure(Msg::filterFailed, {filter.name(), job_.withFinalNames(filter.errorDesc())});
     }
 
     static constexpr auto kSlowStop = std::chrono::seconds(1);
@@ -188,7 +193,7 @@ int Job::runLinked(Runner& runner, Progress& progress) {
     if (result == QvStatus::ok || result == QvStatus::warning) {
         Keyboard keyboard(progress.onTerminal(), [&] { runner.togglePause(); });
         result = runner.wait([&] {
-            if (!options_.quiet) std::fputs("tarsel: stopping; a second signal ends it at once\n", stderr);
+            if (!options_.quiet) writeToStderr(FixedLine(Msg::stopping).text());
         });
     }
     ProgressState end = runner.last();
@@ -202,9 +207,9 @@ void Job::run() {
     std::vector<std::string> names;
     // What has begun to take its place is neither left half-way nor taken back.
     const auto leave = [&] { return files_->leave(); };
-    const std::string last =
-        takesOneStream() ? "stopped; " + inQuotes(options_.output) + " may have a part of it" : "";
-    const Signals::Watch placing(signals_, {.first = [](int) {}, .second = leave, .last = last});
+    const std::optional<Msg> last = takesOneStream() ? std::optional(Msg::stoppedWithPart) : std::nullopt;
+    const Signals::Watch placing(
+        signals_, {.first = [](int) {}, .second = leave, .last = last, .file = options_.output});
     checkSpace();
     storeTask();
     redirectFilters();
@@ -215,7 +220,8 @@ void Job::run() {
         const Signals::Watch running(signals_, {.first = [&](int) { runner.requestStop(); },
                                                 .second = leave,
                                                 .report = [&] { runner.report(); },
-                                                .last = last});
+                                                .last = last,
+                                                .file = options_.output});
         try {
             link(runner);
             const int result = runLinked(runner, progress);
@@ -242,7 +248,7 @@ void Job::run() {
         showWarnings();
         if (!options_.quiet) report(names);
     } catch (const std::bad_alloc&) {
-        writeToStderr("tarsel: done; there was no memory to say more\n");
+        writeToStderr(FixedLine(Msg::doneUnsaid).text());
     }
     if (!options_.post.empty()) runPost(names, progress, end);
     signals_.complete();
@@ -306,8 +312,8 @@ std::string Job::withFinalNames(std::string text) const {
 
 void Job::stopped(Exit signalled) const {
     const bool part = takesOneStream() && taken() > 0;
-    throw Failure(signalled, part ? "stopped; " + inQuotes(options_.output) + " has a part of it"
-                                  : "stopped; nothing was left behind");
+    throw Failure(signalled,
+                  part ? lineOf(Msg::stoppedWithPart, {options_.output}) : lineOf(Msg::stoppedWithNothing));
 }
 
 bool Job::failedForMemory(const Runner& runner) const {
@@ -381,7 +387,7 @@ void Job::runPost(const std::vector<std::string>& names, Progress& progress, Pro
     state.state = "post";
     const auto report = [&] {
         if (progress.isJson()) return progress.report(state);
-        std::fputs("tarsel: the command of --post is running\n", stderr);
+        writeToStderr(FixedLine(Msg::postRuns).text());
     };
     // What comes while the command starts is answered as well.
     const Signals::Watch starting(
@@ -392,8 +398,8 @@ void Job::runPost(const std::vector<std::string>& names, Progress& progress, Pro
         const Signals::Watch running(signals_, {.first = [&](int signal) { command.signal(signal); },
                                                 .second = [&] { return command.kill(), false; },
                                                 .report = report,
-                                                .last = "stopped and ended the command of --post; " +
-                                                        inQuotes(first) + " is complete"});
+                                                .last = Msg::stoppedInPost,
+                                                .file = first});
         // One that came before there was anybody to pass it on.
         if (const int signal = signals_.number()) command.signal(signal);
         status = command.wait();

@@ -286,6 +286,13 @@ VideoJobDescription PictureEffects::job(const FiltersState& filters) const {
 
 namespace {
 
+// A sentence of the engine without a name that the line has already.
+std::string without(std::string sentence, const std::string& name) {
+    if (const size_t at = sentence.find(" " + name); at != std::string::npos)
+        sentence.erase(at, name.size() + 1);
+    return sentence;
+}
+
 // Opens a filter for a moment. One that writes a file would make it then, so it has to wait for the run.
 void tryFilter(QvVideoFilter& filter) {
     if (const std::string written = filterFile(filter, QV_GUI_FILESELECT_SAVE); !written.empty()) {
@@ -307,8 +314,10 @@ void tryFilter(QvVideoFilter& filter) {
     }
     if (result == QvStatus::ok) return;
     if (memory.ranOut()) throw std::bad_alloc();
-    const std::string read = filterFile(filter, QV_GUI_FILESELECT_LOAD);
-    if (!read.empty()) throw failure(Msg::filterFileRefused, {filter.name(), read, reason});
+    if (const std::string read = filterFile(filter, QV_GUI_FILESELECT_LOAD); !read.empty()) {
+        requireFile(read);
+        throw failure(Msg::filterFileRefused, {filter.name(), read, without(reason, read)});
+    }
     throw failure(Msg::filterRefused, {filter.name(), reason});
 }
 

@@ -1,4 +1,4 @@
-// Inputs that can't be used, and names that are hard to handle: a clear line, and nothing left behind.
+// Inputs that can't be used, and names that are hard to handle: a clear line, and nothing that stays.
 #include <sys/stat.h>
 
 #include "tests/system/tool.h"

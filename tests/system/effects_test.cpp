@@ -162,7 +162,8 @@ TEST_F(Effects, WhatCanNotBeDoneIsTold) {
         fails(c.status, Words{"frame", "testgen:size=320x240,duration=0.4", "-o", "x.png"} + c.options,
               c.parts);
     }
-    fails(2, asYuv({"transcode", "clip.yuv", "--crop", "31x16", "-o", "x.yuv"}), {"belong together", "even"});
+    fails(2, asYuv({"transcode", "clip.yuv", "--crop", "31x16", "-o", "x.yuv"}),
+          {"share their colour", "even"});
     fails(2,
           {"transcode", "clip.yuv", "--raw", "size=64x48,pixel=I420,rate=25i", "--crop", "32x16+0+2", "-o",
            "x.yuv"},
@@ -182,7 +183,9 @@ TEST_F(Effects, AFilterThatFailsFailsTheJob) {
         Words options;
         Words parts;
     } cases[] = {
-        {4, {"--filter", "rawdump:filename=/dev/full", "-o", "x.avi"}, {"rawdump", "/dev/full"}},
+        {4,
+         {"--filter", "rawdump:filename=/dev/full", "-o", "x.avi"},
+         {"the filter 'rawdump' can't write '/dev/full': the disk is full"}},
         {4, {"--filter", "rawdump:filename=/dev/full", "--muxer", "nullmux"}, {"rawdump", "/dev/full"}},
         {4, {"--filter", "rawdump:filename=no/x", "-o", "x.avi"}, {"'no/x'", "'no' does not exist"}},
         {4, {"--filter", "rawdump:filename=precious.yuv", "-o", "x.avi"}, {"'precious.yuv'", "exists"}},

@@ -40,6 +40,43 @@ TEST_F(Output, IsNeverAnInput) {
     fails(4, {"transcode", "in.wav", "-o", "t.wav", "--save-task", "in.wav", "-y"},
           {"'in.wav'", "also an input"});
     EXPECT_TRUE(before == contents("in.wav"));
+    // Pictures have numbers, so their name is none of the input's.
+    folder.write("same.raw", patternBytes(kFrame));
+    works({"transcode", "same.raw", "--raw", "size=64x48,pixel=I420,rate=25", "-o", "same.png"});
+    EXPECT_GT(size("same#0.png"), 0);
+}
+
+// A log would empty its file before anything reads it.
+TEST_F(Output, ALogTakesTheNameOfNoOtherFile) {
+    makeYuv("clip.yuv", 2);
+    folder.write("mark.png", "a picture");
+    fs::create_symlink("in.wav", folder.file("link"));
+    const std::string wav = contents("in.wav"), png = contents("mark.png");
+    const struct {
+        const char* log;
+        Words job;
+        const char* other;
+    } cases[] = {
+        {"in.wav", {"info", "in.wav"}, "in.wav"},
+        {"./in.wav", {"transcode", "in.wav", "-o", "out.wav"}, "in.wav"},
+        {"link", {"info", "in.wav"}, "in.wav"},
+        {"out.wav", {"transcode", "in.wav", "-o", "out.wav"}, "out.wav"},
+        {"mark.png", asYuv({"transcode", "clip.yuv", "--logo", "mark.png@0,0", "-o", "x.yuv"}), "mark.png"},
+        {"mark.png",
+         {"transcode", "testgen", "--filter", "logo:xpos=1,filename=mark.png", "-o", "x.yuv"},
+         "mark.png"},
+        {"mark.png", {"transcode", "testgen", "--subtitles=mark.png", "-o", "x.yuv"}, "mark.png"},
+    };
+    for (const auto& c : cases) {
+        const std::string reason =
+            std::string("can't write the log '") + c.log + "': '" + c.other + "' is another file";
+        fails(4, Words{"--log", c.log} + c.job, {reason});
+        fails(4, Words{std::string("--log=") + c.log} + c.job, {reason});
+    }
+    EXPECT_TRUE(wav == contents("in.wav") && png == contents("mark.png"));
+    works({"--log", "info.log", "info", "in.wav"});
+    works({"--log", "info.log", "info", "in.wav"});
+    EXPECT_GT(size("info.log"), 0);
 }
 
 TEST_F(Output, PlacesThatTakeNone) {
@@ -51,7 +88,8 @@ TEST_F(Output, PlacesThatTakeNone) {
         {{"transcode", "in.wav", "-o", "no/out.wav"}, {"'no/out.wav'", "folder 'no' does not exist"}},
         {{"transcode", "in.wav", "-o", "in.wav/out.wav"}, {"'in.wav/out.wav'", "'in.wav' is no folder"}},
         {{"transcode", "in.wav", "-o", "sub.wav", "-y"}, {"'sub.wav'", "this is a folder"}},
-        {{"transcode", "in.wav", "-o", "/proc/out.wav"}, {"'/proc/out.wav'"}},
+        {{"transcode", "in.wav", "-o", "/proc/out.wav"},
+         {"'/proc/out.wav': no such file or folder; check the name"}},
         {{"transcode", "in.wav", "-o", "out.wav", "--save-task", "no/t.xml"},
          {"'no/t.xml'", "does not exist"}},
     };

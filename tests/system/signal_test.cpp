@@ -67,7 +67,8 @@ TEST_F(Signal, StopsAndLeavesWhatWasThere) {
         EXPECT_EQ(o.status, c.status) << o.err;
         EXPECT_THAT(o.err, testing::HasSubstr("\"event\":\"end\""));
         EXPECT_THAT(o.err, testing::HasSubstr("\"state\":\"stopped\""));
-        EXPECT_THAT(o.err, testing::HasSubstr("tarsel: stopped; nothing was left behind\n"));
+        EXPECT_THAT(o.err,
+                    testing::HasSubstr("tarsel: stopped: a signal ended the job; no output was written\n"));
         EXPECT_EQ(listing(), c.before);
     }
     EXPECT_EQ(contents("out.raw"), "precious");

@@ -166,7 +166,7 @@ TEST_F(Streams, AStopEndsAWaitForTheReader) {
     {
         Process run(words({"transcode", endless, "-o", "pipe", "--progress", "json"}), here());
         ASSERT_TRUE(run.waitFor("\"event\":\"start\""));
-        stops(run, SIGTERM, 143, "tarsel: stopped; nothing was left behind");
+        stops(run, SIGTERM, 143, "tarsel: stopped: a signal ended the job; no output was written");
     }
     // Nobody reads it.
     const int reader = open(folder.file("pipe").c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
@@ -181,7 +181,8 @@ TEST_F(Streams, AStopEndsAWaitForTheReader) {
         Process run(words({"transcode", endless, "-o", c.name}), here());
         pollfd data{c.reader, POLLIN, 0};
         ASSERT_EQ(poll(&data, 1, Process::kPatience), 1);
-        stops(run, c.signal, c.status, "tarsel: stopped; '" + c.name + "' has a part of it");
+        stops(run, c.signal, c.status,
+              "tarsel: stopped: a signal ended the job; '" + c.name + "' has a part of the output");
     }
     close(reader), close(sockets[0]), close(sockets[1]);
 }

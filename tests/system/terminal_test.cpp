@@ -23,7 +23,7 @@ TEST_F(Terminal, PausesResumesAndStops) {
     run.type("\x03");
     const Outcome o = run.finish();
     EXPECT_EQ(o.status, 130);
-    EXPECT_THAT(o.out, HasSubstr("stopped; nothing was left behind"));
+    EXPECT_THAT(o.out, HasSubstr("stopped: a signal ended the job; no output was written"));
     EXPECT_EQ(listing(), std::set<std::string>());
 }
 

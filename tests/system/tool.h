@@ -1,4 +1,4 @@
-// What the tests of the tool share: a folder to work in, the tool run in it, inputs, what was left behind.
+// What the tests of the tool share: a folder to work in, the tool run in it, inputs, what a run left.
 #pragma once
 
 #include <gmock/gmock.h>

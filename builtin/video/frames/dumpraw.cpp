@@ -1,6 +1,8 @@
 #include "builtin/video/frames/dumpraw.h"
 
+#include <cerrno>
 #include <cstring>
+#include <system_error>
 
 #include "builtin/creators.h"
 #include "core/arch/platform.h"
@@ -53,10 +55,12 @@ int DumpRaw::close() {
 }
 
 int DumpRaw::writeFailed() {
+    const int error = errno != 0 ? errno : EIO;
     file_.reset();
     failed_ = true;
     qv_log()->error("[rawdump] fail to write to %s.", settings_.filename.c_str());
-    return setError(QvStatus::failed, "fail to write to %s", settings_.filename.c_str());
+    return setError(QvStatus::failed, "fail to write to %s: %s", settings_.filename.c_str(),
+                    std::generic_category().message(error).c_str());
 }
 
 int DumpRaw::append(const QvFrame& frame) {

@@ -133,8 +133,8 @@ int AnimatedLogo::openMovie() {
     else if (qv_registry()->module(decoder.c_str()))
         movie_.reset(QvDecFactory::decodePipeUsing(Any(name), AnyVector(Any(decoder.c_str()))));
     if (!movie_)
-        return setError(QvStatus::failed, "The logo movie %s can't be opened by %s", name,
-                        decoder.empty() ? "its extension; 'decoder' may name a module" : decoder.c_str());
+        return setError(QvStatus::failed, "No decoder%s%s opens the logo movie %s",
+                        decoder.empty() ? "" : " ", decoder.c_str(), name);
     if (movie_->nrStreams(qvVideoStream) == 0) {
         qv_dbg()->error("[animated logo] no video streams in file %s", name);
         return setError(QvStatus::failed, "The logo movie %s has no picture", name);

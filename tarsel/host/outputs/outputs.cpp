@@ -38,8 +38,10 @@ fs::path inFolder(const std::string& folder, const std::string& filename) {
     return folder == "." ? fs::path(filename) : fs::path(folder) / filename;
 }
 
-[[noreturn]] void refuse(const fs::path& name, const std::string& why) {
-    throw Failure(Exit::output, "can't write " + inQuotes(name.string()) + ": " + why);
+[[noreturn]] void refuse(Msg id, const fs::path& name) { throw failure(id, {name.string()}); }
+
+[[noreturn]] void refuse(const fs::path& name, int error) {
+    throw systemFailure(Msg::outputSystem, name.string(), error);
 }
 
 bool sameFile(const fs::path& a, const fs::path& b) {
@@ -51,14 +53,13 @@ void checkFolder(const fs::path& name) {
     const fs::path folder = folderOf(name);
     std::error_code error;
     const auto status = fs::status(folder, error);
-    const std::string quoted = inQuotes(folder.string());
     if (fs::is_directory(status)) {
         if (::access(folder.c_str(), W_OK | X_OK) != 0)
-            refuse(name, "the folder " + quoted + " may not be written");
+            throw failure(Msg::outputFolderClosed, {name.string(), folder.string()});
     } else if (fs::exists(status)) {
-        refuse(name, quoted + " is no folder");
+        throw failure(Msg::outputFolderNone, {name.string(), folder.string()});
     } else if (status.type() == fs::file_type::none) {
-        refuse(name, inLine(error.message()));
+        refuse(name, error.value());
     } else {
         throw failure(Msg::outputFolderAbsent, {name.string(), folder.string()});
     }
@@ -107,11 +108,10 @@ Outputs::Outputs(const std::string& output, const std::string& option, const std
       transaction_(with ? std::move(with) : std::make_shared<Transaction>()),
       base_(kBase) {
     std::error_code error;
-    if (output.empty()) throw Failure(Exit::usage, option + ": the name of the output is empty");
+    if (output.empty()) throw failure(Msg::outputNameEmpty, {option});
     // The engine takes both slashes for separators.
-    if (folderOf(output_).string().find('\\') != std::string::npos)
-        refuse(output_, "a backslash can't stand in the name of the folder");
-    if (fs::is_directory(output_, error)) refuse(output_, "this is a folder; give a file name in it");
+    if (folderOf(output_).string().find('\\') != std::string::npos) refuse(Msg::outputBackslash, output_);
+    if (fs::is_directory(output_, error)) refuse(Msg::outputIsFolder, output_);
     target_ = followed(output_);
     checkFolder(output_);
     putInOrder(folderOf(output_));
@@ -144,9 +144,9 @@ void Outputs::checkFinal(const fs::path& name) const {
     if (isInput(name)) throw failure(Msg::outputIsInput, {name.string()});
     std::error_code error;
     const auto status = fs::symlink_status(name, error);
-    if (error && status.type() == fs::file_type::none) refuse(name, inLine(error.message()));
+    if (error && status.type() == fs::file_type::none) refuse(name, error.value());
     if (!policy_.overwrite && fs::exists(status)) throw failure(Msg::outputExists, {name.string()});
-    if (fs::is_directory(name, error)) refuse(name, "a folder of this name is in the way");
+    if (fs::is_directory(name, error)) refuse(Msg::outputFolderInTheWay, name);
 }
 
 void Outputs::number(const NumberedName& name) {
@@ -200,8 +200,7 @@ std::string Outputs::hiddenName(const std::string& extension) const {
 
 std::string Outputs::begin(const std::string& extension) {
     const fs::path where = folderOf(set_ ? output_ : target_);
-    if (const int error = transaction_->enter(where.string(), place_))
-        refuse(output_, inLine(std::strerror(error)));
+    if (const int error = transaction_->enter(where.string(), place_)) refuse(output_, error);
     extension_ = extension;
     if (const size_t number = place_->members++; number > 0) base_ = std::to_string(number) + "-" + kBase;
     fs::path name = fs::path(place_->work.path()) / base_;
@@ -250,7 +249,7 @@ std::vector<fs::path> Outputs::written() const {
     if (!place_ || !place_->work) return files;
     const int work = place_->work.handle();
     std::vector<std::string> names;
-    if (const int error = listFolder(work, names)) refuse(output_, inLine(std::strerror(error)));
+    if (const int error = listFolder(work, names)) refuse(output_, error);
     if (isRemoved(work)) throw failure(Msg::outputFolderGone, {output_.string()});
     for (const auto& name : names)
         if (name.rfind(base_, 0) == 0) files.push_back(fs::path(place_->work.path()) / name);

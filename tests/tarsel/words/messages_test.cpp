@@ -8,6 +8,7 @@
 #include <cstring>
 #include <set>
 
+#include "tarsel/words/fixedline.h"
 #include "tarsel/words/systemcause.h"
 
 namespace {
@@ -17,10 +18,11 @@ const std::set<std::string> kNaming = {"{file}", "{name}", "{option}"};
 
 // What needs to name neither: it is about the whole call, or names its subject itself.
 const std::set<Msg> kNamesNothing = {
-    Msg::commandMissing,    Msg::commandLineWrong, Msg::chainRefused, Msg::standardOutput,
-    Msg::outOfMemory,       Msg::engineFailed,     Msg::systemFailed, Msg::inputMissing,
-    Msg::captionsCut,       Msg::captionsLate,     Msg::leftRemoved,  Msg::toolHasNoThread,
-    Msg::streamNeedsFormat,
+    Msg::commandMissing,     Msg::commandLineWrong,  Msg::chainRefused, Msg::standardOutput,
+    Msg::outOfMemory,        Msg::engineFailed,      Msg::systemFailed, Msg::inputMissing,
+    Msg::captionsCut,        Msg::captionsLate,      Msg::leftRemoved,  Msg::toolHasNoThread,
+    Msg::streamNeedsFormat,  Msg::outputMissing,     Msg::stopping,     Msg::stopped,
+    Msg::stoppedWithNothing, Msg::doneUnsaid,
     Msg::engineWarns,  // a sentence of the engine
 };
 
@@ -72,9 +74,12 @@ bool names(const Message& row) {
            std::string_view(row.what).rfind("testgen", 0) == 0;
 }
 
+// How a run is at the moment: nothing is wrong, so there is no reason to give.
+bool isNote(const Message& row) { return row.id == Msg::stopping || row.id == Msg::postRuns; }
+
 void expectReadable(const std::string& line) {
     for (const char* unwanted :
-         {"Qv", "::", "  ", "..", " ;", " :", "behind the", "told", ".tarsel-", "[", "{", "}"})
+         {"Qv", "::", "  ", "..", " ;", " :", "behind", "told", ".tarsel-", "[", "{", "}"})
         if (std::string_view(unwanted) != ".." || line.find("...") == std::string::npos) {
             EXPECT_EQ(line.find(unwanted), std::string::npos) << line << ": " << unwanted;
         }
@@ -91,7 +96,7 @@ TEST(Messages, EachSaysWhatWhyAndWhatToDo) {
         std::printf("%d  %s\n", static_cast<int>(row.exit), line.c_str());
         const bool warning = row.exit == Exit::done, engines = row.id == Msg::engineWarns;
         EXPECT_NE(*row.what, '\0') << line;
-        EXPECT_TRUE(*row.why || engines) << line;
+        EXPECT_TRUE(*row.why || engines || isNote(row)) << line;
         EXPECT_TRUE(*row.remedy || warning) << line;
         EXPECT_NE(names(row), kNamesNothing.count(row.id) > 0) << line;
         // The brackets of an option's syntax are no trace of the log.
@@ -109,6 +114,22 @@ TEST(Messages, ValuesAreShownSoThatTheyStayOnTheLine) {
               "--pixel: there is no pixel format 'I42O'; 'tarsel formats' lists all");
     EXPECT_EQ(lineOf(Msg::engineWarns, {"[scc] Rate is a guess.\n"}), "rate is a guess");
     EXPECT_EQ(failure(Msg::outputExists, {"a"}).exit(), Exit::output);
+}
+
+// Without memory of its own it says the same.
+TEST(Messages, AFixedLineIsTheSameLine) {
+    for (const Message& row : messages()) {
+        if (!placeholders(row).empty()) continue;
+        EXPECT_EQ(FixedLine(row.id).text(), "tarsel: " + lineOf(row.id) + "\n");
+    }
+    EXPECT_EQ(
+        FixedLine(Msg::pluginEndedAll, {"a\x1b[2J.so", "it crashed"}).text(),
+        "tarsel: the plug-in 'a?[2J.so' ended the program while it was loaded: it crashed; remove it, or get "
+        "another version of it\n");
+    const std::string longest(10000, 'x');
+    const FixedLine cut(Msg::outputExists, {longest});
+    EXPECT_EQ(cut.text().back(), '\n');
+    EXPECT_LT(cut.text().size(), longest.size());
 }
 
 TEST(Messages, ErrorsOfTheSystemHaveACauseAndARemedy) {
