@@ -48,10 +48,12 @@ enum class QvLibraryTrust {
 
 enum class QvLibraryFault {
     none,
-    unreadable,  // not there, or may not be read
-    unsafe,      // in the hands of others
-    invalid,     // not a whole shared library of this machine
-    unresolved,  // the loader refuses it: something that it needs is not there
+    unreadable,    // not there, or may not be read
+    unsafe,        // in the hands of others
+    invalid,       // not a whole shared library of this machine
+    unresolved,    // the loader refuses it: a library that it needs is not there
+    unsafeFolder,  // a folder that leads to it is in the hands of others
+    foreign,       // its libraries are there, but lack a function, a variable or a version that it needs
 };
 
 struct QvLibrary {

@@ -4,13 +4,15 @@
 #include <array>
 #include <cstdio>
 #include <cstdlib>
-#include <string_view>
+#include <vector>
 
 #include <signal.h>
 
 #include <qvplugcore/qvplugcore.h>
 
+#include "tarsel/host/files.h"
 #include "tarsel/host/terminal.h"
+#include "tarsel/words/fixedline.h"
 #include "tarsel/words/messages.h"
 
 namespace {
@@ -22,32 +24,14 @@ void warn(const std::string& line) {
     std::fprintf(stderr, "tarsel: warning: %s\n", line.c_str());
 }
 
-// A line in memory that is there already: a crashed program has no other to offer.
-class FixedLine {
-  public:
-    void add(std::string_view text) {
-        const std::size_t count = std::min(text.size(), text_.size() - 1 - length_);
-        length_ += text.copy(&text_[length_], count);
-    }
-    void addName(std::string_view name) {
-        add("'");
-        for (const char c : name)
-            add(static_cast<unsigned char>(c) < 0x20 || c == 0x7F ? "?" : std::string_view(&c, 1));
-        add("'");
-    }
-    std::string_view end() {
-        text_[length_++] = '\n';
-        return {text_.data(), length_};
-    }
-
-  private:
-    std::array<char, 6000> text_;
-    std::size_t length_ = 0;
-};
-
 constexpr std::array kCrashes = {
-    std::pair{SIGSEGV, "it crashed"}, std::pair{SIGBUS, "it crashed"},  std::pair{SIGFPE, "it crashed"},
-    std::pair{SIGILL, "it crashed"},  std::pair{SIGABRT, "it aborted"},
+    std::pair{SIGSEGV, "it crashed"},
+    std::pair{SIGBUS, "it crashed"},
+    std::pair{SIGFPE, "it crashed"},
+    std::pair{SIGILL, "it crashed"},
+    std::pair{SIGABRT, "it aborted"},
+    std::pair{SIGTRAP, "it crashed"},
+    std::pair{SIGSYS, "it made a system call that is forbidden here"},
 };
 std::array<struct sigaction, kCrashes.size()> g_former;
 
@@ -89,9 +73,11 @@ class CrashWatch {
 Msg messageOf(QvPluginFault fault) {
     switch (fault) {
         case QvPluginFault::unreadable: return Msg::pluginUnreadable;
-        case QvPluginFault::unsafe: return Msg::pluginUnsafe;
+        case QvPluginFault::unsafe:
+        case QvPluginFault::unsafeFolder: return Msg::pluginUnsafe;
         case QvPluginFault::invalid: return Msg::pluginInvalid;
         case QvPluginFault::unresolved: return Msg::pluginUnresolved;
+        case QvPluginFault::foreign: return Msg::pluginForeign;
         case QvPluginFault::noEntry:
         case QvPluginFault::otherAbi: return Msg::pluginUnfit;
         case QvPluginFault::failed:
@@ -106,17 +92,35 @@ std::string harmless(const std::string& text) {
     return quoted.substr(1, quoted.size() - 2);
 }
 
+// A warning for each file; one for all that are in the same unsafe folder.
+void tell(const std::string& folder, const std::vector<QvPluginFailure>& failures) {
+    for (auto failure = failures.begin(); failure != failures.end(); ++failure) {
+        const auto sharesFolder = [&](const QvPluginFailure& other) {
+            return other.fault == QvPluginFault::unsafeFolder && failure->fault == other.fault &&
+                   failure->reason == other.reason;
+        };
+        if (std::any_of(failures.begin(), failure, sharesFolder)) continue;
+        const auto count = std::count_if(failure, failures.end(), sharesFolder);
+        const std::string reason = harmless(failure->reason);
+        const Any name = failure->file.toString();
+        if (count > 1)
+            warn(lineOf(Msg::pluginsUnsafe, {std::to_string(count), folder, reason}));
+        else
+            warn(lineOf(messageOf(failure->fault), {name.asString(""), reason}));
+    }
+}
+
 }  // namespace
 
 void loadPlugins(const std::string& folder) {
     std::atexit([] { blameLoadingPlugin("it called exit()"); });
+    std::at_quick_exit([] { blameLoadingPlugin("it called quick_exit()"); });
     const CrashWatch watch;
-    if (qv_registry()->scanFolder(Any(folder.c_str())) != QvStatus::ok)
+    if (const std::string why = whyNoFolder(folder); !why.empty())
+        warn(lineOf(Msg::pluginsNoFolder, {folder, why}));
+    else if (qv_registry()->scanFolder(Any(folder.c_str())) != QvStatus::ok)
         warn(lineOf(Msg::pluginsAbsent, {folder}));
-    for (const QvPluginFailure& failure : qv_registry()->pluginFailures()) {
-        const Any name = failure.file.toString();
-        warn(lineOf(messageOf(failure.fault), {name.asString(""), harmless(failure.reason)}));
-    }
+    tell(folder, qv_registry()->pluginFailures());
 }
 
 int pluginWarnings() { return g_warnings; }
@@ -124,18 +128,6 @@ int pluginWarnings() { return g_warnings; }
 void blameLoadingPlugin(const char* why) {
     const char* const file = QvRegistry::loadingPlugin();
     if (!file) return;
-    const Message& row = messages()[static_cast<std::size_t>(Msg::pluginEndedAll)];
-    const std::string_view what = row.what, placeholder = "{file}";
-    const std::size_t at = what.find(placeholder);
-    FixedLine line;
-    line.add("tarsel: ");
-    line.add(what.substr(0, at));
-    line.addName(file);
-    line.add(what.substr(at + placeholder.size()));
-    line.add(": ");
-    line.add(why);
-    line.add("; ");
-    line.add(row.remedy);
-    writeToStderr(line.end());
-    leave(static_cast<int>(row.exit));
+    writeToStderr(FixedLine(Msg::pluginEndedAll, {file, why}).text());
+    leave(static_cast<int>(messages()[static_cast<std::size_t>(Msg::pluginEndedAll)].exit));
 }

@@ -4,8 +4,8 @@
 #include <string>
 
 // Loads them, and prints a warning for each one that was not loaded. A plug-in that ends the program in its
-// start, by a crash or by exit(), is named in the program's last line, and the status is that of a missing
-// module.
+// start, by a crash, exit() or quick_exit(), is named in the program's last line, and the status is that of a
+// missing module. Nothing can notice _exit().
 void loadPlugins(const std::string& folder);
 int pluginWarnings();  // how many were printed
 

@@ -94,6 +94,8 @@ TEST_F(Plugins, BadFilesLeaveALineAndAReason) {
         {"declining_plugin.so", nullptr, QvPluginFault::declined, "declined to load"},
         {"needy_plugin.so", failed, QvPluginFault::unresolved,  // the library is not brought along
          "needs the library 'libqvtestdependency.so', which is not there"},
+        {"unlinked_plugin.so", failed, QvPluginFault::foreign,
+         "needs 'qvtest::formerly(int, char const*)', which no library here has"},
         {"foreign_plugin.so", "%s was built for version 2", QvPluginFault::otherAbi,
          "was built for version 2 of the plug-in interface; this engine has version 1"},
         {"half_plugin.so", failed, QvPluginFault::invalid, "is incomplete: it ends after 5000 bytes"},
@@ -106,7 +108,7 @@ TEST_F(Plugins, BadFilesLeaveALineAndAReason) {
     fs::create_directory(folder.file("folder_plugin.so"));
     fs::resize_file(bring("pcm8_plugin.so", "half_plugin.so"), 5000);
     fs::permissions(bring("pcm8_plugin.so", "unreadable_plugin.so"), fs::perms::none);
-    for (int i = 0; i < 5; ++i) bring(cases[i].file);
+    for (int i = 0; i < 6; ++i) bring(cases[i].file);
     std::size_t failures = 0;
     for (const auto& c : cases) {
         SCOPED_TRACE(c.file);

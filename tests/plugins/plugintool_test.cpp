@@ -53,12 +53,43 @@ TEST_F(PluginTool, NamesEachOneThatDoesNotLoadAndGoesOn) {
     o = transcode({"--allow-unsafe-plugins"});
     EXPECT_EQ(o.status, 0);
     EXPECT_EQ(o.err, before + after + wrote + "(3 warnings)\n");
-    // Anybody may add a file there.
-    fs::permissions(folder.file("plugins"), fs::perms{01777});
+}
+
+// Anybody may add a file there, so all of them are refused: in one line.
+TEST_F(PluginTool, NamesAnUnsafeFolderOnce) {
+    bring("pcm8_plugin.so", "good_plugin.so");
+    const std::string place = folder.file("plugins");
+    fs::permissions(place, fs::perms{01777});
+    const std::string why = "is in the folder '" + place +
+                            "', to which other users may write; keep plug-ins where only you and root may "
+                            "write, or use --allow-unsafe-plugins";
+    Outcome o = transcode();
+    EXPECT_EQ(o.status, 3);
+    EXPECT_THAT(o.err, HasSubstr(notLoaded("good", why)));
+    bring("pcm8_plugin.so", "other_plugin.so");
+    bring("needy_plugin.so", "third_plugin.so");
     o = transcode();
     EXPECT_EQ(o.status, 3);
-    EXPECT_THAT(o.err, HasSubstr(notLoaded("good", "is in the folder '" + folder.file("plugins") +
-                                                       "', to which other users may write" + safe)));
+    EXPECT_EQ(o.err.rfind("tarsel: warning: 3 plug-ins of 'plugins' were not loaded: each " + why + "\n", 0),
+              0u)
+        << o.err;
+    EXPECT_EQ(o.err.find("_plugin.so"), std::string::npos) << o.err;
+}
+
+TEST_F(PluginTool, SaysWhyAFolderGivesNone) {
+    folder.write("file", "text");
+    const struct {
+        const char *folder, *reason;
+    } cases[] = {{"nowhere", "no such folder; check its name and permissions"},
+                 {"file/below", "not a directory; check its name and permissions"},
+                 {"file", "this is no folder; check its name and permissions"},
+                 {"plugins", "no file '*_plugin.so' was found there; check the folder's name"}};
+    for (const auto& c : cases) {
+        const Outcome o = tarsel({"--plugins", c.folder, "modules"});
+        EXPECT_EQ(o.status, 0);
+        EXPECT_EQ(o.err, std::string("tarsel: warning: no plug-ins were loaded from '") + c.folder +
+                             "': " + c.reason + "\n");
+    }
 }
 
 TEST_F(PluginTool, NamesTheOneThatEndsTheProgram) {
@@ -66,10 +97,17 @@ TEST_F(PluginTool, NamesTheOneThatEndsTheProgram) {
     const struct {
         const char *start, *why;
     } cases[] = {
-        {"before main: exit", "it called exit()"}, {"before main: crash", "it crashed"},
-        {"before main: fault", "it crashed"},      {"before main: overflow", "it crashed"},
-        {"before main: abort", "it aborted"},      {"before main: throw", "an exception left its start"},
-        {"entry: exit", "it called exit()"},       {"entry: crash", "it crashed"},
+        {"before main: exit", "it called exit()"},
+        {"before main: crash", "it crashed"},
+        {"before main: fault", "it crashed"},
+        {"before main: overflow", "it crashed"},
+        {"before main: abort", "it aborted"},
+        {"before main: throw", "an exception left its start"},
+        {"entry: exit", "it called exit()"},
+        {"entry: crash", "it crashed"},
+        {"entry: trap", "it crashed"},
+        {"entry: quick_exit", "it called quick_exit()"},
+        {"entry: system call", "it made a system call that is forbidden here"},
     };
     ProcessOptions options = here();
     for (const auto& c : cases) {

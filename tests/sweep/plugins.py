@@ -13,6 +13,8 @@ INIT = EXPORT + "void* plugin_init() {{ {0} }}\n"
 SOURCES = {  # name: the text of its one unit
     "null": INIT.format("return nullptr;"),
     "exits": INIT.format("std::exit(0);"),
+    "exits-quickly": INIT.format("std::quick_exit(0);"),
+    "traps": INIT.format("std::raise(SIGTRAP); return nullptr;"),
     "throws": INIT.format('throw std::runtime_error("x");'),
     "throws-a-number": INIT.format("throw 7;"),
     "crashes": INIT.format("std::raise(SIGSEGV); return nullptr;"),

@@ -1,8 +1,10 @@
+#include <cxxabi.h>
 #include <dlfcn.h>
 #include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
 #include <cerrno>
+#include <cstdlib>
 #include <cstring>
 
 #include "core/arch/platform.h"
@@ -23,12 +25,42 @@ std::string missingDependency(const std::string& message) {
     return library.find('/') == std::string::npos ? library : "";
 }
 
-// The loader's message without the file's own name, which it begins with.
-std::string reasonOf(const std::string& message, const std::string& name) {
-    const std::string missing = missingDependency(message);
-    if (!missing.empty()) return "needs the library '" + missing + "', which is not there";
+// What stands in `message` after `before` and in front of the next one of `ends`; "" without `before`.
+std::string wordAfter(const std::string& message, std::string_view before, std::string_view ends) {
+    const std::size_t at = message.find(before);
+    if (at == std::string::npos) return "";
+    const std::size_t begin = at + before.size();
+    return message.substr(begin, message.find_first_of(ends, begin) - begin);
+}
+
+// The name of a symbol as its source has it. C++ types can make it endless, so it is cut.
+std::string readable(const std::string& symbol) {
+    constexpr std::size_t mostMangled = 1000, mostShown = 60;
+    int status = -1;
+    char* const text = symbol.size() > mostMangled
+                           ? nullptr
+                           : abi::__cxa_demangle(symbol.c_str(), nullptr, nullptr, &status);
+    std::string name = status == 0 && text ? text : symbol;
+    std::free(text);
+    if (name.size() > mostShown) name = name.substr(0, mostShown) + "...";
+    return name;
+}
+
+// What the loader says when it refuses a file: of a library that is not there, of a symbol that no library
+// has, or of a version of one. Else its message without the file's own name, which it begins with.
+QvLibrary refusal(const std::string& message, const std::string& name) {
+    if (const std::string missing = missingDependency(message); !missing.empty())
+        return {nullptr, QvLibraryFault::unresolved,
+                "needs the library '" + missing + "', which is not there"};
+    if (const std::string symbol = wordAfter(message, "undefined symbol: ", " ,\t"); !symbol.empty())
+        return {nullptr, QvLibraryFault::foreign,
+                "needs '" + readable(symbol) + "', which no library here has"};
+    if (const std::string version = wordAfter(message, ": version `", "'"); !version.empty())
+        return {nullptr, QvLibraryFault::foreign,
+                "needs the version '" + version + "' of a library, which is not here"};
     const bool named = message.starts_with(name + ": ");
-    return "can't be loaded: " + (named ? message.substr(name.size() + 2) : message);
+    return {nullptr, QvLibraryFault::unresolved,
+            "can't be loaded: " + (named ? message.substr(name.size() + 2) : message)};
 }
 
 // A file for reading; a name that leads to a pipe or a device does not block.
@@ -101,8 +133,7 @@ class Loader {
             if (result.handle) break;
             const char* const message = dlerror();
             const std::string missing = missingDependency(message ? message : "");
-            result.fault = QvLibraryFault::unresolved;
-            result.reason = reasonOf(message ? message : "unknown reason", name);
+            result = refusal(message ? message : "unknown reason", name);
             if (missing.empty() || missing == last || depth == 0) break;
             last = missing;
             void* const dependency = loadDependency(missing, depth - 1, result.reason);

@@ -87,7 +87,8 @@ class Walk {
         struct stat facts {};
         if (lstat(name.c_str(), &facts) != 0) return refuseAbsent(errno);
         if (checks_ && !isOurs(facts))
-            return refuse(QvLibraryFault::unsafe, what(facts, name) + "belongs to another user");
+            return refuse(S_ISDIR(facts.st_mode) ? QvLibraryFault::unsafeFolder : QvLibraryFault::unsafe,
+                          what(facts, name) + "belongs to another user");
         if (S_ISLNK(facts.st_mode))
             follow(name);
         else if (!rest_.empty())
@@ -105,10 +106,10 @@ class Walk {
         if (stat(folder.c_str(), &facts) != 0) {
             refuseAbsent(errno);
         } else if (!isOurs(facts)) {
-            refuse(QvLibraryFault::unsafe,
+            refuse(QvLibraryFault::unsafeFolder,
                    "is in the folder '" + folder + "', which belongs to another user");
         } else if ((rest_.empty() || !(facts.st_mode & S_ISVTX)) && othersMayWrite(facts, folder)) {
-            refuse(QvLibraryFault::unsafe,
+            refuse(QvLibraryFault::unsafeFolder,
                    "is in the folder '" + folder + "', to which other users may write");
         }
         return result_.reason.empty();

@@ -27,6 +27,8 @@ constexpr QvPluginFault faultOf(QvLibraryFault fault) {
         case QvLibraryFault::unreadable: return QvPluginFault::unreadable;
         case QvLibraryFault::unsafe: return QvPluginFault::unsafe;
         case QvLibraryFault::invalid: return QvPluginFault::invalid;
+        case QvLibraryFault::unsafeFolder: return QvPluginFault::unsafeFolder;
+        case QvLibraryFault::foreign: return QvPluginFault::foreign;
         default: return QvPluginFault::unresolved;
     }
 }

@@ -72,14 +72,16 @@ using QvPluginInit = QvPlugin* (*)();
 constexpr unsigned qvPluginAbi = 1;
 
 enum class QvPluginFault {
-    unreadable,  // the file is not there, or may not be read
-    unsafe,      // other users may change the file or a folder that leads to it
-    invalid,     // it is not a whole shared library of this machine
-    unresolved,  // a library or a symbol that it needs is not there
-    noEntry,     // it has no "plugin_init"
-    otherAbi,    // its "qv_plugin_abi" is not the engine's
-    failed,      // its "plugin_init" threw
-    declined,    // its "plugin_init" returned null
+    unreadable,    // the file is not there, or may not be read
+    unsafe,        // other users may change the file or a link that leads to it
+    invalid,       // it is not a whole shared library of this machine
+    unresolved,    // a library that it needs is not there
+    noEntry,       // it has no "plugin_init"
+    otherAbi,      // its "qv_plugin_abi" is not the engine's
+    failed,        // its "plugin_init" threw
+    declined,      // its "plugin_init" returned null
+    unsafeFolder,  // other users may change a folder that leads to it; the reason names the folder
+    foreign,       // it was built against other versions: a symbol that it needs is in no library
 };
 
 // A plug-in file that was not loaded.

@@ -79,9 +79,9 @@ class QV_API QvRegistry {
     // was loaded later is not among them. Valid until the next loadPlugin, scanFolder or cleanup.
     const std::vector<QvPluginFailure>& pluginFailures() const;
     // The file that loadPlugin is loading at this moment, or null. A plug-in can end the process while it
-    // starts, by a crash, an exit or an exception from a static constructor (which ends in std::terminate).
-    // The library installs no handlers; an application that does can name the culprit. Safe in handlers of
-    // signals, std::terminate and exit. The text is valid during the handler.
+    // starts, by a crash, an exit, a quick_exit or an exception from a static constructor (which ends in
+    // std::terminate). The library installs no handlers; an application that does can name the culprit. Safe
+    // in handlers of signals, std::terminate and exit. The text is valid during the handler.
     static const char* loadingPlugin();
     // Adds a plug-in that is in memory already; it must outlive its stay in the list. 0.
     int addPlugin(QvPlugin* plugin);
