@@ -2,7 +2,8 @@
 outputs have to be the same. Odd sizes and formats with padded rows are where such bytes come from."""
 from runner import Box, crashed
 
-FORMATS = ["GRAY", "I420", "YV12", "I422", "YUYV", "UYVY", "Y216", "v210", "BGR3", "BGR4"]
+FORMATS = ["GRAY", "I420", "YV12", "I422", "YUYV", "UYVY", "Y216", "v210", "W016", "BGR3", "BGR4", "BGRA",
+           "ARGB", "R32C", "b64a", "R555", "R565"]
 SIZES = ["34x18", "33x17", "50x2", "7x5"]
 
 

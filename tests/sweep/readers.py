@@ -1,7 +1,7 @@
 """What the jobs write, read by others: ffmpeg, sox, pngcheck, and libpng's pngfix.
 
-The expected bytes come from the inputs, from the raw files of the same pictures, or from another reader; never from
-the reader of this library.
+The expected bytes come from the inputs, or from what another program makes of the same inputs; never from the reader
+or a raw output of this library.
 """
 import shutil
 import struct
@@ -14,8 +14,8 @@ from runner import Box, crashed
 TOOLS = "ffmpeg", "ffprobe", "sox", "pngcheck", "pngfix"
 # Pixel format of the tool, and what ffmpeg calls the same samples in a raw file.
 RAW_FORMATS = {"BGR3": "bgr24", "BGR4": "bgr0", "I420": "yuv420p", "YUYV": "yuyv422", "UYVY": "uyvy422",
-               "YV12": None, "v210": None}
-
+               "YV12": "yuv420p", "v210": "yuv422p10le"}
+WIDTH, HEIGHT, FRAMES = 64, 48, 5
 
 def unsound(name, data):
     """How a file contradicts itself, or None."""
@@ -116,41 +116,111 @@ def check_channels(box):
         same(f"channel {channel}", sound(box, f"ch#{channel:02}.wav"), one)
 
 
+def planes(frame):
+    """The planes of a frame in I420."""
+    y, c = WIDTH * HEIGHT, WIDTH * HEIGHT // 4
+    return frame[:y], frame[y:y + c], frame[y + c:]
+
+
+def cut(data, size):
+    return [data[at:at + size] for at in range(0, len(data), size)]
+
+
+def noise(size):
+    """Frames of any bytes."""
+    return jobs.pattern(size * FRAMES, 29)
+
+
+def every(data, *places):
+    """Bytes exchanged in each group of so many: `places` says where each comes from, None is 255."""
+    size = max(p for p in places if p is not None) + 1
+    return b"".join(bytes(255 if p is None else group[p] for p in places) for group in cut(data, size))
+
+
+# What a raw picture of one format is in another one that holds the same samples: bytes that only change their places.
+SAME_SAMPLES = [
+    ("I420", "I420", lambda data: data),
+    ("I420", "YV12", lambda data: b"".join(y + v + u for y, u, v in map(planes, cut(data, WIDTH * HEIGHT * 3 // 2)))),
+    ("YUYV", "UYVY", lambda data: every(data, 1, 0, 3, 2)),
+    ("UYVY", "YUYV", lambda data: every(data, 1, 0, 3, 2)),
+    ("BGR3", "BGR3", lambda data: data),
+    ("BGR3", "BGR4", lambda data: every(data, 0, 1, 2, None)),
+    ("BGRA", "ARGB", lambda data: every(data, 3, 2, 1, 0)),
+]
+BYTES = {"I420": 1.5, "YV12": 1.5, "YUYV": 2, "UYVY": 2, "BGR3": 3, "BGR4": 4, "BGRA": 4, "v210": 8 / 3}
+
+
+def raw_input(box, pixel, name="noise.raw"):
+    """Frames in a pixel format, and the arguments that name them."""
+    frame = HEIGHT * 256 if pixel == "v210" else int(BYTES[pixel] * WIDTH * HEIGHT)
+    data = noise(frame)
+    if pixel == "v210":  # three samples of ten bits in each word, and the two bits above them clear; none is reserved
+        words = (4 + i * 37 % 1016 | 4 + i * 53 % 1016 << 10 | 4 + i * 71 % 1016 << 20 for i in range(len(data) // 4))
+        data = b"".join(struct.pack("<I", word) for word in words)
+    (box.work / name).write_bytes(data)
+    return data, ["transcode", name, "--raw", f"size={WIDTH}x{HEIGHT},pixel={pixel},rate=25", "-y"]
+
+
 def check_raw(box):
-    made(box, *jobs.card("--pixel", "I420", "-o", "card.yuv"))
-    if len((box.work / "card.yuv").read_bytes()) != 5 * 64 * 48 * 3 // 2:
-        raise Unlike("card.yuv is not five frames long")
+    made(box, *jobs.card("-o", "card.yuv"))
     if len(sound(box, "card.wav")) != 8820 * 4:
         raise Unlike("card.wav is not 0.2 s long")
+    for given, pixel, expected in SAME_SAMPLES:
+        data, job = raw_input(box, given)
+        made(box, *job, "--pixel", pixel, "-o", "out.raw")
+        same(f"{given} as {pixel}", (box.work / "out.raw").read_bytes(), expected(data))
+    data, job = raw_input(box, "I420")
+    size = len(data) // FRAMES
+    made(box, *job, "--from", "0.04", "--to", "0.16", "-o", "out.raw")
+    same("frames 1 to 3", (box.work / "out.raw").read_bytes(), data[size:4 * size])
+    made(box, *job, "--flip", "-o", "out.raw")
+    mirrored = ffmpeg(box, "noise.raw", "-f", "rawvideo", "-pix_fmt", "yuv420p", "-s", f"{WIDTH}x{HEIGHT}",
+                      ["-vf", "vflip", "-f", "rawvideo"])
+    same("upside down", (box.work / "out.raw").read_bytes(), mirrored)
+
+
+def theirs(box, pixel, out):
+    """The pictures of the raw input, as ffmpeg itself reads them."""
+    if pixel == "v210":
+        return pictures(box, "noise.raw", out, "-f", "v210", "-s", f"{WIDTH}x{HEIGHT}")
+    data = (box.work / "noise.raw").read_bytes()
+    if pixel == "YV12":
+        data = b"".join(y + u + v for y, v, u in map(planes, cut(data, WIDTH * HEIGHT * 3 // 2)))
+    (box.work / "theirs.raw").write_bytes(data)
+    return pictures(box, "theirs.raw", out, "-f", "rawvideo", "-pix_fmt", RAW_FORMATS[pixel], "-s",
+                    f"{WIDTH}x{HEIGHT}")
 
 
 def check_avi(box):
+    samples = jobs.pattern(8820 * 4)
+    (box.work / "s.wav").write_bytes(jobs.wav(samples))
     for pixel, named in RAW_FORMATS.items():
-        made(box, *jobs.card("--pixel", pixel, "-o", "card.avi"))
-        made(box, *jobs.card("--pixel", pixel, "-o", "card.raw"))
-        if pixel == "v210":
-            before, named = ["-f", "v210", "-s", "64x48"], "yuv422p10le"
-        elif pixel == "YV12":  # as I420, with the chroma planes exchanged
-            raw = (box.work / "card.raw").read_bytes()
-            size, y = 64 * 48 * 3 // 2, 64 * 48
-            frames = [raw[at:at + size] for at in range(0, len(raw), size)]
-            (box.work / "card.raw").write_bytes(b"".join(f[:y] + f[y * 5 // 4:] + f[y:y * 5 // 4] for f in frames))
-            before, named = ["-f", "rawvideo", "-pix_fmt", "yuv420p", "-s", "64x48"], "yuv420p"
-        else:
-            before = ["-f", "rawvideo", "-pix_fmt", named, "-s", "64x48"]
+        _, job = raw_input(box, pixel)
+        made(box, *job, "s.wav", "--pixel", pixel, "-o", "noise.avi")
         out = "bgr24" if pixel == "BGR4" else named
-        same(f"pictures of {pixel}", pictures(box, "card.avi", out), pictures(box, "card.raw", out, *before))
-        same(f"sound next to {pixel}", sound(box, "card.avi"), sound(box, "card.wav"))
+        same(f"pictures of {pixel}", pictures(box, "noise.avi", out), theirs(box, pixel, out))
+        same(f"sound next to {pixel}", sound(box, "noise.avi"), samples)
 
 
 def check_pictures(box):
-    made(box, *jobs.card("-o", "card.png"))
-    made(box, *jobs.card("--pixel", "BGR3", "-o", "card.raw"))
-    raw = pictures(box, "card.raw", "rgb24", "-f", "rawvideo", "-pix_fmt", "bgr24", "-s", "64x48")
-    for number in range(5):
-        check_png(box, f"card#{number}.png")
-        part = raw[number * 9216:(number + 1) * 9216]
-        same(f"picture {number}", pictures(box, f"card#{number}.png", "rgb24"), part)
+    _, job = raw_input(box, "BGR3")
+    made(box, *job, "-o", "noise.png")
+    right = theirs(box, "BGR3", "rgb24")
+    for number, part in enumerate(cut(right, WIDTH * HEIGHT * 3)):
+        check_png(box, f"noise#{number}.png")
+        same(f"picture {number}", pictures(box, f"noise#{number}.png", "rgb24"), part)
+    made(box, "frame", "noise.raw", *job[2:4], "--at", "0.08", "-o", "shot.png")
+    check_png(box, "shot.png")
+    same("one picture", pictures(box, "shot.png", "rgb24"), cut(right, WIDTH * HEIGHT * 3)[2])
+    # Colours are converted: as ffmpeg does it, except for rounding and for how chroma is sited.
+    smooth = bytes([*(60 + x + y for y in range(HEIGHT) for x in range(WIDTH)),
+                    *(96 + x for y in range(HEIGHT // 2) for x in range(WIDTH // 2)),
+                    *(160 - y for y in range(HEIGHT // 2) for x in range(WIDTH // 2))])
+    (box.work / "noise.raw").write_bytes(smooth)
+    made(box, "frame", "noise.raw", *jobs.RAW, "-o", "shot.png", "-y")
+    far = max(abs(a - b) for a, b in zip(pictures(box, "shot.png", "rgb24"), theirs(box, "I420", "rgb24")))
+    if far > 4:
+        raise Unlike(f"colours differ by {far}")
     made(box, "frame", *jobs.CLIP, "--sheet", "3x2", "-o", "sheet.png")
     check_png(box, "sheet.png")
     pictures(box, "sheet.png", "rgb24")
