@@ -128,8 +128,11 @@ int RawAviMux::close() {
     for (int nr = 0; nr < nrStreams(qvVideoStream); ++nr)
         if (static_cast<AviStream*>(stream(qvVideoStream, nr))->holdsPart())
             result = setError(QvStatus::failed, "The last picture of video stream #%d is incomplete", nr);
-    const bool written = interleaver_.close();
-    end();
+    bool written = false;
+    {
+        const Undo ending([this] { end(); });  // also if the index gets no memory
+        written = interleaver_.close();
+    }
     return written ? result : fail();
 }
 

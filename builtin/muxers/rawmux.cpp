@@ -157,17 +157,18 @@ int RawMux::abort() { return getState() == qvStateOpen ? finish(1) : QvStatus::o
 
 // Every file is finished, whatever happens to one of them; the first failure is told.
 int RawMux::finish(int abort) {
-    std::string failure;
+    const QvBufStream* failed = nullptr;
     for (const int type : {qvAudioStream, qvVideoStream})
         for (int nr = 0; nr < nrStreams(type); ++nr) {
             auto& output = *stream(type, nr);
             if (!output.inited()) continue;
             output.destroy(abort);
-            if (failure.empty() && output.ioError() != 0) failure = output.ioErrorText();
+            if (!failed && output.ioError() != 0) failed = &output;
         }
     for (auto& output : outputs_) output->release();
     if (getState() == qvStateOpen) setState(stateInitialised);
-    return failure.empty() || abort ? QvStatus::ok : setError(QvStatus::failed, "%s", failure.c_str());
+    if (!failed || abort) return QvStatus::ok;
+    return setError(QvStatus::failed, "%s", failed->ioErrorText().c_str());
 }
 
 AnyVector RawMux::filesWritten() const {

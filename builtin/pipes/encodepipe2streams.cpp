@@ -256,19 +256,20 @@ void EncodePipe2::removeStream(int type, int nr) {
 
 void EncodePipe2::removeStreams(int mask) {
     if (refuseWhileOpen() != QvStatus::ok) return;
-    Streams removed;
-    for (auto index = streams_.size(); index-- > 0;) {
-        auto& stream = streams_[index];
+    // Those that go are gathered at the end, which takes no memory: a destructor comes here.
+    auto kept = streams_.end();
+    for (auto at = streams_.end(); at != streams_.begin();) {
+        const auto& stream = *--at;
         if (!qvStreamTypeMatches(stream->type, mask)) continue;
         const int nr = numberOf(*stream);
         detach(*stream);
         stream->bitstream = nullptr;
         qv_dbg()->debug("[EncodePipe %p] Removed %s #%d", static_cast<void*>(this),
                         qvStreamTypeName(stream->type), nr);
-        removed.push_back(std::move(stream));
-        streams_.erase(streams_.begin() + static_cast<std::ptrdiff_t>(index));
+        kept = std::rotate(at, at + 1, kept);
     }
     if (muxer_) muxer_->removeStreams(mask);
+    streams_.erase(kept, streams_.end());
 }
 
 int EncodePipe2::setCodec(int type, int nr, const char* name, const AnyDict& params) {

@@ -106,8 +106,11 @@ void FileSink::finish(int abort) {
 int FileSink::close() {
     QV_ASSERT_MSG(getState() != stateCreated, "not inited");
     if (getState() != qvStateOpen) return QvStatus::ok;
-    const int result = doNothing_ ? QvStatus::ok : writeOut();
-    finish(0);
+    int result = QvStatus::ok;
+    {
+        const Undo finishing([this] { finish(0); });
+        if (!doNothing_) result = writeOut();
+    }
     if (result != QvStatus::ok || (!doNothing_ && stream_.ioError() != 0)) return failFlush();
     return QvStatus::ok;
 }

@@ -6,15 +6,22 @@
 //     closing.dismiss();
 #pragma once
 
+#include <new>
 #include <utility>
 
-// `Action` must not throw: it runs while an exception is on its way.
+// It runs while an exception is on its way, often for want of memory, so the action should not take any. If
+// it does and gets none, the first exception goes on: what the action did not reach is left to the
+// destructors. Any other exception from it ends the program.
 template <class Action>
 class Undo {
   public:
     explicit Undo(Action action) : action_(std::move(action)) {}
     ~Undo() {
-        if (armed_) action_();
+        if (!armed_) return;
+        try {
+            action_();
+        } catch (const std::bad_alloc&) {
+        }
     }
     Undo(const Undo&) = delete;
     Undo& operator=(const Undo&) = delete;

@@ -1,6 +1,8 @@
-// Makes the n-th operator new of this thread fail. One source of an executable includes this.
+// Makes the n-th operator new of this thread fail, or all from the n-th on. One source of an executable
+// includes this.
 //
-//     FailingMemory memory(7);  // the seventh from here on
+//     FailingMemory memory(7);                       // the seventh from here on, and no other
+//     FailingMemory none(7, FailingMemory::andAllLater);
 //     ... memory.failed() tells whether it was reached
 #pragma once
 
@@ -16,13 +18,22 @@
 
 class FailingMemory {
   public:
-    explicit FailingMemory(int nth) { left_ = nth; }
-    ~FailingMemory() { left_ = 0; }
+    enum Extent { once, andAllLater };
+
+    explicit FailingMemory(int nth, Extent extent = once) {
+        left_ = nth;
+        ever_ = extent == andAllLater;
+    }
+    ~FailingMemory() {
+        left_ = 0;
+        ever_ = false;
+    }
     FailingMemory(const FailingMemory&) = delete;
     FailingMemory& operator=(const FailingMemory&) = delete;
     static bool failed() { return left_ < 0; }
 
     static void* allocate(std::size_t bytes, std::size_t align) {
+        if (left_ < 0 && ever_) return nullptr;
         if (left_ > 0 && --left_ == 0) {
             left_ = -1;
             return nullptr;
@@ -32,6 +43,7 @@ class FailingMemory {
 
   private:
     static inline thread_local int left_ = 0;  // allocations until the one that fails; -1 after it
+    static inline thread_local bool ever_ = false;
 };
 
 namespace failing_memory {

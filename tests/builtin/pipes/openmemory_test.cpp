@@ -1,5 +1,5 @@
-// Each allocation of an output's opening fails in turn: the output then is as it was, and opens when there is
-// memory.
+// Each allocation of an output's opening fails in turn, alone or with all later ones: the output then is as
+// it was, and opens when there is memory.
 #include <functional>
 
 #include "core/arch/qvexception.h"
@@ -82,11 +82,12 @@ TEST_F(OpenWithoutMemory, IsUndoneWhateverTheForm) {
             for (const char* name : {"muxer/splitVideo", "muxer/splitAudio"}) pipe_->setParam(name, 1);
             pipe_->setParam("muxer/rawAsPng", form.png);
         }
-        openUntilItWorks([&](int nth, bool& opened) {
-            const FailingMemory memory(nth);
-            opened = open();
-            return FailingMemory::failed();
-        });
+        for (const auto extent : {FailingMemory::once, FailingMemory::andAllLater})
+            openUntilItWorks([&](int nth, bool& opened) {
+                const FailingMemory memory(nth, extent);
+                opened = open();
+                return FailingMemory::failed();
+            });
         openUntilItWorks([&](int nth, bool& opened) {
             NoMemory blocks(nth - 1);
             const PlatformScope scope(blocks);
