@@ -57,7 +57,7 @@ class QV_API XmlNode {
     XmlNode* child(int index) const { return children_.at(index); }  // an assertion outside the range
     XmlNode* child(const char* name) const;                          // the first of this name, or null
     void addChild(XmlNode* child);                                   // takes ownership
-    void deleteChildren();
+    void deleteChildren();                                           // takes no memory
 
     // Writes the element to a std::FILE*, two blanks an indent. -1 if the node has no name or the stream
     // refuses a part, else 0; children without a name are left out. What can't stand in a document (control
@@ -66,6 +66,8 @@ class QV_API XmlNode {
     int write(void* stream, int indent) const;
 
   private:
+    static void deleteTree(XmlNode* node);
+
     std::string data_;
     int capacity_ = 512;  // the bound of sprintf; memory is taken as needed
     bool named_ = false;
@@ -91,8 +93,8 @@ class QV_API XmlParser {
     static constexpr long long maxExpanded = 64LL << 20;  // the bytes that all `gen` elements describe
     // restoreDict alone: the dictionaries under a class name, each of which takes several hundred bytes of
     // memory. A document may hold more of them if it has at least bytesPerObject bytes for each.
-    // Within these limits neither a tree nor its dictionary takes more than 60 bytes of memory for a byte of
-    // a document of a megabyte or more.
+    // Within these limits a tree and its dictionary together take at most 60 bytes of memory for a byte of a
+    // document of a megabyte or more, also while it is read; those of a smaller one at most 60 MiB.
     static constexpr int maxObjects = 20'000;
     static constexpr int bytesPerObject = 16;
 

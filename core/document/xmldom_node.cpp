@@ -79,16 +79,31 @@ void XmlNode::addChild(XmlNode* child) {
     children_.append(child);
 }
 
-// One after the other, however deep the tree is: each node hands on its children before it goes.
 void XmlNode::deleteChildren() {
-    if (children_.empty()) return;
-    std::vector<XmlNode*> pending(children_.begin(), children_.end());
-    children_.clear();
-    while (!pending.empty()) {
-        XmlNode* const node = pending.back();
-        pending.pop_back();
-        pending.insert(pending.end(), node->children_.begin(), node->children_.end());
-        node->children_.clear();
+    while (!children_.empty()) deleteTree(children_.remove(children_.size() - 1));
+}
+
+// However deep the tree is, and without memory, which may be the reason why it goes: on the way down the
+// place of a node's first child holds the node above it.
+void XmlNode::deleteTree(XmlNode* node) {
+    for (XmlNode* above = nullptr; node || above;) {
+        if (node && !node->children_.empty()) {
+            XmlNode* const first = node->children_.at(0);
+            node->children_.set(0, above);
+            above = node;
+            node = first;
+            continue;
+        }
         delete node;
+        node = nullptr;
+        if (!above) continue;
+        if (above->children_.size() > 1) {
+            node = above->children_.remove(above->children_.size() - 1);
+            continue;
+        }
+        XmlNode* const done = above;
+        above = done->children_.at(0);
+        done->children_.clear();
+        delete done;
     }
 }

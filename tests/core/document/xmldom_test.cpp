@@ -1,8 +1,23 @@
 #include "core/document/xmldom.h"
 
+#include <algorithm>
 #include <cstdio>
+#include <cstdlib>
+#include <fstream>
 
 #include "tests/support/checks.h"
+#include "tests/support/child.h"
+
+#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
+#define QV_SANITIZED 1
+#elif defined(__has_feature)
+#if __has_feature(address_sanitizer) || __has_feature(thread_sanitizer)
+#define QV_SANITIZED 1
+#endif
+#endif
+#ifndef QV_SANITIZED
+#define QV_SANITIZED 0
+#endif
 
 namespace {
 
@@ -173,6 +188,71 @@ TEST(XmlParser, standardStreamsStayOpen) {
     EXPECT_EQ(XmlParser::storeXmlTree("stdout", &root, nullptr), 0);
     const std::string once = "<?xml version=\"1.0\" encoding=\"UTF-8\" ?>\n<shown/>\n";
     EXPECT_EQ(testing::internal::GetCapturedStdout(), once + once);
+}
+
+// What `run` takes at its peak, in bytes, measured in a process of its own; -1 if the system does not tell.
+template <class Run>
+long long peakOf(Run run) {
+    int ends[2];
+    if (pipe(ends) != 0) return -1;
+    inChild([&] {
+        const auto status = [](const std::string& field) {
+            std::ifstream file("/proc/self/status");
+            for (std::string line; std::getline(file, line);)
+                if (line.starts_with(field)) return 1024 * std::atoll(line.c_str() + field.size());
+            return -1LL;
+        };
+        // The peak of the past is forgotten.
+        const bool forgets = static_cast<bool>(std::ofstream("/proc/self/clear_refs") << "5" << std::flush);
+        const long long before = status("VmRSS:");
+        run();
+        const long long bytes = forgets ? status("VmHWM:") - before : -1;
+        return write(ends[1], &bytes, sizeof bytes) == sizeof bytes ? 0 : 1;
+    });
+    long long bytes = -1;
+    close(ends[1]);
+    if (read(ends[0], &bytes, sizeof bytes) != sizeof bytes) bytes = -1;
+    close(ends[0]);
+    return bytes;
+}
+
+// The documents that take most: many small elements, attributes, dictionaries.
+TEST(XmlParser, memoryStaysInProportionToTheDocument) {
+#if QV_SANITIZED
+    GTEST_SKIP() << "a sanitizer takes memory of its own";
+#endif
+    const TempFolder folder;
+    constexpr std::size_t megabyte = std::size_t{1} << 20;
+    for (const char* body : {"<a/>", "<a b=''/>", "<a b='' c='' d='' e=''/>", "<key/><i32/>",
+                             "<key>a</key><x/>    ", "<key>k</key><vec/>", "<str/>", "x<a/>"})
+        for (const std::size_t size : {megabyte / 8, megabyte}) {
+            std::string text = "<d><key>v</key><vec>";
+            while (text.size() < size) text += body;
+            const std::string file = folder.write("a.xml", text + "</vec></d>");
+            const auto most = static_cast<long long>(60 * std::max(text.size(), megabyte));
+            EXPECT_LT(peakOf([&] { XmlParser().parseFile(file.c_str()); }), most) << body << size;
+            EXPECT_LT(peakOf([&] {
+                          AnyDict dict;
+                          Any name, version;
+                          XmlParser::restoreDict(file.c_str(), dict, name, version);
+                      }),
+                      most)
+                << body << size;
+        }
+}
+
+// Want of memory may be the reason why a tree goes.
+TEST(XmlNode, treesOfAnyShapeGoWithoutALoss) {
+    XmlNode root("root");
+    XmlNode* deep = &root;
+    for (int i = 0; i < 100'000; ++i) {
+        for (int k = 0; k < i % 4; ++k) new XmlNode("leaf", nullptr, deep);
+        XmlNode* const next = new XmlNode("inner", nullptr, deep);
+        for (int k = 0; k < i % 3; ++k) new XmlNode("a", nullptr, new XmlNode("late", nullptr, deep));
+        deep = next;
+    }
+    root.deleteChildren();
+    EXPECT_EQ(root.nrChildren(), 0);
 }
 
 }  // namespace
