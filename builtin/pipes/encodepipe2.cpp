@@ -2,6 +2,7 @@
 #include "builtin/pipes/encodepipe2.h"
 
 #include <algorithm>
+#include <new>
 
 #include "builtin/creators.h"
 #include "core/arch/qvassert.h"
@@ -16,7 +17,11 @@ EncodePipe2::~EncodePipe2() {
     if (getState() == qvStateOpen) finish(true);
     setState(stateInitialised);
     removeStreams(qvAllStreams);
-    dropMuxer();
+    try {
+        dropMuxer();
+    } catch (const std::bad_alloc&) {
+        muxer_.reset();  // what it could not reset is in the sink, which goes as well
+    }
 }
 
 int EncodePipe2::init() {

@@ -1,5 +1,8 @@
 #include "core/decode/qvdpipelist.h"
 
+#include <memory>
+#include <new>
+
 #include "core/arch/qvassert.h"
 #include "core/decode/qvdecoder.h"
 
@@ -19,12 +22,13 @@ QvDecodePipe* QvDPipeList::findByFilename(const Any& name, const QvDecodePipe* a
 }
 
 void QvDPipeList::deleteAll() {
-    TPtrList<QvDecodePipe> distinct;
-    for (int i = 0; i < size(); ++i)
-        if (!distinct.contains(at(i))) distinct.append(at(i));
-    clear();
-    for (int i = 0; i < distinct.size(); ++i) {
-        distinct.at(i)->close();
-        delete distinct.at(i);
+    while (!empty()) {
+        const std::unique_ptr<QvDecodePipe> first(at(0));
+        for (int i = size(); i-- > 0;)
+            if (at(i) == first.get()) remove(i);
+        try {
+            first->close();
+        } catch (const std::bad_alloc&) {  // its destructor does the rest
+        }
     }
 }

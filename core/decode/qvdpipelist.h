@@ -13,6 +13,6 @@ class QV_API QvDPipeList : public TPtrList<QvDecodePipe> {
     // First decoder after `after` (null: from the start) whose "filename" equals `name`, or null. Asserts
     // that each decoder answers text and that `after` is in the list.
     QvDecodePipe* findByFilename(const Any& name, const QvDecodePipe* after = nullptr) const;
-    // Closes and deletes each decoder once and clears the list.
+    // Closes and deletes each decoder once and clears the list. Takes no memory.
     void deleteAll();
 };

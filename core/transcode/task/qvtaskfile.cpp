@@ -12,8 +12,12 @@
 #include "core/document/xmldom.h"
 #include "core/document/xmlline_p.h"
 #include "core/encode/qvencodepipe.h"
+#include "core/engine/modules/qvmodule.h"
+#include "core/engine/modules/qvregistry.h"
 #include "core/engine/status.h"
+#include "core/measure/streamtype.h"
 #include "core/transcode/task/qvtranscodetask.h"
+#include "core/value/numbertext_p.h"
 
 namespace {
 
@@ -52,18 +56,25 @@ struct Fault {
     throw Fault{place, QvStatus::invalidStructure, reason};
 }
 
-bool isWhole(Text text) {
-    while (!text.empty() && Text(" \t\r\n").find(text.front()) != Text::npos) text.remove_prefix(1);
-    while (!text.empty() && Text(" \t\r\n").find(text.back()) != Text::npos) text.remove_suffix(1);
-    long long value = 0;
+// Whether nothing but a number of this type is there, within its range. Reading would take as much of the
+// text as is one, or the nearest limit.
+template <class Number>
+bool isNumber(Text text) {
+    text = qvnumber::begin(text);
+    text = text.substr(0, text.find_last_not_of(qvnumber::blanks) + 1);
+    Number value = 0;
     const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), value);
     return error == std::errc() && end == text.data() + text.size();
 }
 
-bool isDecimal(Text text) {
-    double value = 0;
-    const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), value);
-    return error == std::errc() && end == text.data() + text.size();
+enum class Range { i32, i64 };
+
+bool isWhole(Text text, Range range) {
+    return range == Range::i32 ? isNumber<int>(text) : isNumber<long long>(text);
+}
+
+std::string notWhole(Range range) {
+    return std::string("is no whole number of ") + (range == Range::i32 ? "32" : "64") + " bits";
 }
 
 std::string attribute(const XmlNode& node, const char* name) {
@@ -75,17 +86,18 @@ std::string attribute(const XmlNode& node, const char* name) {
 
 struct Numbers {
     Text element;
-    const char* attributes[4];
+    Range range;
+    const char *attributes[4], *others[3];
 };
 
-// Elements whose attributes are numbers that must be there.
+// Elements whose attributes are numbers: those that must be there, and others.
 constexpr Numbers numbersOf[] = {
-    {"framerate", {"num", "denom"}},
-    {"pt", {"x", "y"}},
-    {"rect", {"top", "bottom", "left", "right"}},
-    {"pair", {"first", "second"}},
-    {"mediatime", {"ticks", "scale"}},
-    {"bitrate", {"target"}},
+    {"framerate", Range::i32, {"num", "denom"}, {"df", "interlaced", "pulldown"}},
+    {"pt", Range::i32, {"x", "y"}, {}},
+    {"rect", Range::i32, {"top", "bottom", "left", "right"}, {}},
+    {"pair", Range::i32, {"first", "second"}, {}},
+    {"mediatime", Range::i64, {"ticks", "scale"}, {}},
+    {"bitrate", Range::i32, {"target"}, {"min", "max", "mode"}},
 };
 
 bool isDictionary(const Place& place) {
@@ -111,16 +123,24 @@ void checkDictionary(const Place& place) {
     }
 }
 
+void checkAttributes(const Place& place, const Numbers& row) {
+    const auto check = [&](const char* one, bool required) {
+        const std::string text = one ? attribute(*place.node, one) : "0";
+        if ((required || !text.empty()) && !isWhole(text, row.range))
+            damaged(place, std::string("its '") + one + "' " + notWhole(row.range));
+    };
+    for (const char* one : row.attributes) check(one, true);
+    for (const char* one : row.others) check(one, false);
+}
+
 void checkValue(const Place& place) {
     const Text name = place.name(), data = place.node->data();
-    if ((name == "i32" || name == "i64") && !isWhole(data)) damaged(place, "it is no whole number");
-    if (name == "fl" && !isDecimal(data)) damaged(place, "it is no number");
+    for (const auto& [type, range] : {std::pair{"i32", Range::i32}, std::pair{"i64", Range::i64}})
+        if (name == type && !isWhole(data, range)) damaged(place, "it " + notWhole(range));
+    if (name == "fl" && !isNumber<double>(data)) damaged(place, "it is no number");
     if (name == "key") damaged(place, "the key before it has no value");
     for (const Numbers& row : numbersOf)
-        if (name == row.element)
-            for (const char* one : row.attributes)
-                if (one && !isWhole(attribute(*place.node, one)))
-                    damaged(place, std::string("its '") + one + "' is no whole number");
+        if (name == row.element) checkAttributes(place, row);
     if (name == "vec")
         for (int i = 0; i < place.node->nrChildren(); ++i) checkValue(place.child(i, std::to_string(i + 1)));
     if (isDictionary(place)) checkDictionary(place);
@@ -193,13 +213,68 @@ void checkStreams(const Place& root, const std::vector<std::string>& files) {
 void checkTask(const Place& root) {
     if (root.name() != rootName)
         damaged(root, "this is no task: its outermost element is '" + std::string(root.name()) + "'");
-    if (attribute(*root.node, "version").empty()) damaged(root, "its version is missing");
+    const std::string version = attribute(*root.node, "version");
+    if (version.empty()) damaged(root, "its version is missing");
+    if (!isNumber<double>(version)) damaged(root, "its version is no number");
     checkDictionary(root);
+    for (const Text key : {"__version__", "__class__"})
+        if (const Place own = root.entry(key)) damaged(own, "this is no key of a file");
     std::vector<std::string> names;
     const Place files = list(root, "files", "input file");
-    for (int i = 0; i < files.node->nrChildren(); ++i)
-        names.push_back(text(files.child(i, std::to_string(i + 1)), "filename"));
+    for (int i = 0; i < files.node->nrChildren(); ++i) {
+        const Place file = files.child(i, std::to_string(i + 1));
+        names.push_back(text(file, "filename"));
+        if (names.back().empty()) damaged(file.entry("filename"), "the name is empty");
+    }
     checkStreams(root, names);
+}
+
+// --- The modules that it names.
+
+// `named` is a text, or a dictionary, whose name is an attribute or a key. One without a name is not checked.
+void checkModule(const Place& named, int type, const char* kind) {
+    if (!named) return;
+    std::string name = isDictionary(named) ? attribute(*named.node, "name") : "";
+    const Place key = isDictionary(named) ? named.entry("name") : named;
+    if (name.empty() && key && (key.name() == "str" || key.name() == "wstr")) name = key.node->data();
+    if (name.empty()) return;
+    const std::unique_ptr<QvCodec> codec(qv_registry()->newCodec(name.c_str()));
+    if (!codec || !codec->getInterface(type))
+        throw Fault{named, QvStatus::failed, std::string("there is no ") + kind + " '" + name + "' here"};
+}
+
+// The filters of a stream that have no fixed place.
+void checkFilters(const Place& source, int type) {
+    const Place process = source.entry("process");
+    const Place filters = process && isDictionary(process) ? process.entry("filters") : process;
+    const Place custom = filters && isDictionary(filters) ? filters.entry("customFilters") : filters;
+    if (!custom || custom.name() != "vec") return;
+    for (int i = 0; i < custom.node->nrChildren(); ++i)
+        checkModule(custom.child(i, std::to_string(i + 1)),
+                    type == qvVideoStream ? QvModuleType::videoFilter : QvModuleType::audioFilter, "filter");
+}
+
+void checkModules(const Place& root) {
+    const Place files = root.entry("files"), encoder = root.entry("encoder");
+    for (int i = 0; i < files.node->nrChildren(); ++i)
+        checkModule(files.child(i, std::to_string(i + 1)).entry("decoder"), QvModuleType::decoder, "decoder");
+    checkModule(encoder.entry("muxer"), QvModuleType::muxer, "multiplexer");
+    const Place streams = encoder.entry("streams");
+    for (int i = 0; i < streams.node->nrChildren(); ++i) {
+        const Place stream = streams.child(i, std::to_string(i + 1));
+        const int type = streamType(stream);
+        if (type != qvSubpicStream)
+            checkModule(stream.entry("codec"),
+                        type == qvVideoStream ? QvModuleType::videoEncoder : QvModuleType::audioEncoder,
+                        "encoder");
+    }
+    const Place outputs = root.entry("streams");
+    for (int i = 0; i < outputs.node->nrChildren(); ++i) {
+        const Place output = outputs.child(i, std::to_string(i + 1));
+        const Place sources = output.entry("sources");
+        for (int k = 0; sources && k < sources.node->nrChildren(); ++k)
+            checkFilters(sources.child(k, std::to_string(k + 1)), streamType(output));
+    }
 }
 
 // --- The file.
@@ -220,16 +295,28 @@ QvTaskFault syntaxFault(const Any& file, const std::string& text) {
             text.substr(before.size(), line - before.size())};
 }
 
+// What the output says when it can't be made, as the rest of a sentence.
+std::string reasonOf(const QvEncodePipe& pipe) {
+    std::string said = pipe.errorCode() != QvStatus::ok ? pipe.errorDesc() : "";
+    if (said.size() > 1 && said[0] >= 'A' && said[0] <= 'Z' && said[1] >= 'a')
+        said[0] = static_cast<char>(said[0] + ('a' - 'A'));
+    std::string reason = "the output can't be made from these settings";
+    if (!said.empty()) reason += ": " + said;
+    while (reason.back() == '.') reason.pop_back();
+    return reason;
+}
+
 // Makes the output once, for what only its modules know.
 void tryEncoder(const Place& root, const AnyDict& state) {
     const std::unique_ptr<QvEncodePipe> pipe(QvEncodePipe::create());
     if (!pipe) throw Fault{root.entry("encoder"), QvStatus::failed, "the module 'encpipe' is missing"};
-    const char* const reason = "the output can't be made from these settings";
     try {
         if (pipe->restore(state.getDict("encoder")) == QvStatus::ok) return;
+    } catch (const QvMemoryFailure&) {
+        throw;
     } catch (const QvException&) {
     }
-    throw Fault{root.entry("encoder"), QvStatus::failed, reason};
+    throw Fault{root.entry("encoder"), QvStatus::failed, reasonOf(*pipe)};
 }
 
 QvTaskFault checked(const Any& file, AnyDict& state) {
@@ -246,6 +333,7 @@ QvTaskFault checked(const Any& file, AnyDict& state) {
         Any name, version;
         if (XmlParser::restoreDict(file, state, name, version) != QvStatus::ok)
             throw Fault{root, QvStatus::cannotParse, "the file has changed meanwhile"};
+        checkModules(root);
         tryEncoder(root, state);
     } catch (const Fault& fault) {
         return faultOf(file, fault);
@@ -257,12 +345,17 @@ QvTaskFault checked(const Any& file, AnyDict& state) {
 template <class Action>
 QvTaskFault guarded(Action action) noexcept {
     try {
-        return action();
+        try {
+            return action();
+        } catch (const QvMemoryFailure&) {
+        } catch (const QvException&) {
+            return {QvStatus::failed, "", 0, "the engine refuses it"};
+        }
     } catch (const std::bad_alloc&) {
-        return {QvStatus::outOfMemory, "", 0, "out of memory"};
     } catch (...) {
-        return {QvStatus::failed, "", 0, "the engine refuses it"};
+        return {QvStatus::failed, "", 0, "it is refused"};  // short: these texts need no memory
     }
+    return {QvStatus::outOfMemory, "", 0, "out of memory"};
 }
 
 }  // namespace
@@ -276,14 +369,18 @@ QvTaskFault QvTaskFile::check(const Any& file) noexcept {
 
 QvTask* QvTaskFile::open(const Any& file, QvDPipeList& decoders, QvEncodePipe** encoder,
                          QvFileOpenCb* callback, QvTaskFault* fault) noexcept {
-    QvTask* task = nullptr;
+    std::unique_ptr<QvTask> task;
+    QvEncodePipe* pipe = nullptr;
     QvDPipeList opened;
+    const int before = decoders.size();
     QvTaskFault found = guarded([&]() -> QvTaskFault {
         AnyDict state;
         if (QvTaskFault first = checked(file, state); first.status != QvStatus::ok) return first;
         Any error;
         try {
-            task = QvTask::fromState(state, opened, encoder, 0, callback, &error);
+            task.reset(QvTask::fromState(state, opened, &pipe, 0, callback, &error));
+        } catch (const QvMemoryFailure&) {
+            throw;
         } catch (const QvException&) {
             error = "an input can't be opened, or lacks a stream";
         }
@@ -291,7 +388,14 @@ QvTask* QvTaskFile::open(const Any& file, QvDPipeList& decoders, QvEncodePipe** 
         for (int i = 0; i < opened.size(); ++i) decoders.append(opened.at(i));
         return {};
     });
-    if (found.status != QvStatus::ok && !task) opened.deleteAll();
+    if (found.status == QvStatus::ok) {
+        if (encoder) *encoder = pipe;
+    } else {
+        while (decoders.size() > before) decoders.remove(before);
+        task.reset();
+        delete pipe;
+        opened.deleteAll();
+    }
     if (fault) *fault = std::move(found);
-    return task;
+    return task.release();
 }

@@ -31,8 +31,8 @@ struct QvTaskFault {
 
 class QV_API QvTaskFile {
   public:
-    // The document, its values and what a task must hold; then the output is made once, which opens no file.
-    // Inputs are not opened.
+    // The document, its values and what a task must hold; then the modules that it names are looked for, and
+    // the output is made once, which opens no file. Inputs are not opened.
     static QvTaskFault check(const Any& file) noexcept;
 
     // Checks a file and restores its task, as QvTask::fromState does: the caller owns the task, the pipe and

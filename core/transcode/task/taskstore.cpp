@@ -106,16 +106,18 @@ void QvTask::store(AnyDict& dict, int) const {
 }
 
 int QvTask::openInputs(const AnyVector& files, QvDPipeList& opened, QvFileOpenCb* callback) {
+    const int before = opened.size();
     for (int i = 0; i < files.size(); ++i) {
         if (!files.at(i).isDict()) continue;
         const AnyDict& file = files.at(i).asDict();
         Any name;
-        if (QvDecodePipe* decoder = openInput(file, callback))
-            opened.append(decoder);
-        else
+        if (std::unique_ptr<QvDecodePipe> decoder{openInput(file, callback)}) {
+            opened.append(decoder.get());
+            static_cast<void>(decoder.release());
+        } else
             qv_dbg()->warning("Task.restore: failed to open %s", printable(file.get("filename"), name));
     }
-    return opened.size();
+    return opened.size() - before;
 }
 
 int QvTask::restore(const AnyDict& state, QvDPipeList& decoders, QvEncodePipe** encoderOut, int,
@@ -145,10 +147,8 @@ int QvTask::restore(const AnyDict& state, QvDPipeList& decoders, QvEncodePipe** 
     if (files.empty())
         return setError(QvStatus::invalidStructure,
                         "Task.restore: invalid task state structure - no input file(s) specified");
-    QvDPipeList opened;
-    if (openInputs(files, opened, callback) == 0)
+    if (openInputs(files, decoders, callback) == 0)
         return setError(QvStatus::cannotParse, "Task.restore: no input file(s) successfully opened");
-    for (int i = 0; i < opened.size(); ++i) decoders.append(opened.at(i));
     encoder_ = pipe.get();
     ForgetEncoder forget{*this};  // the pipe goes with a failure, so nothing may point to it
     for (int i = 0; i < pipe->nrStreams(); ++i) {

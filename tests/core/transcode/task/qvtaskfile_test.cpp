@@ -2,57 +2,13 @@
 
 #include <sstream>
 
-#include "core/document/xmldom.h"
 #include "core/encode/qvencodepipe.h"
 #include "core/engine/status.h"
 #include "core/transcode/task/qvtranscodetask.h"
+#include "tests/core/transcode/task/soundtask.h"
 #include "tests/support/checks.h"
-#include "tests/support/engine.h"
-#include "tests/support/temp_folder.h"
-#include "tests/support/wav_bytes.h"
 
 namespace {
-
-// The file of a task: two WAV files into raw sound.
-struct TaskFile {
-    TaskFile() {
-        const std::string wav = folder.write("in.wav", riff(wavChunk("fmt ", wavFormat(1, 2, 48000, 16)) +
-                                                            wavChunk("data", patternBytes(1920))));
-        std::unique_ptr<QvEncodePipe> pipe(QvEncodePipe::create());
-        pipe->clearStreams();
-        pipe->addAudioStream(Any("rawaenc"));
-        pipe->addAudioStream(Any("rawaenc"));
-        AnyDict encoder, state;
-        pipe->store(encoder);
-        const auto stream = [&](int number) {
-            const AnyDict source("file", wav.c_str(), "stream", Any(Pair(2, number)));
-            return Any(AnyDict("type", 2, "sources", AnyVector(Any(source))));
-        };
-        const Any file(AnyDict("filename", wav.c_str()));
-        state = AnyDict("__version__", "2.0", "encoder", encoder, "files", AnyVector(file, file), "streams",
-                        AnyVector(stream(0), stream(0)), "rate", Any(QvFramerate(25.0)), "gain", 0.5);
-        name = folder.file("job.xml");
-        XmlParser::storeDict(name.c_str(), state, "TranscodeTask", "2.0");
-        text = TempFolder::read(name);
-    }
-
-    QvTaskFault check(const std::string& document) const {
-        folder.write("job.xml", document);
-        return QvTaskFile::check(name.c_str());
-    }
-    // The first `from` after `after` becomes `to`.
-    std::string with(const std::string& after, const std::string& from, const std::string& to) const {
-        std::string changed = text;
-        const std::size_t start = changed.find(after), at = changed.find(from, start);
-        EXPECT_NE(start, std::string::npos) << after;
-        EXPECT_NE(at, std::string::npos) << from;
-        return changed.replace(at, from.size(), to);
-    }
-
-    EngineScope engine;
-    TempFolder folder;
-    std::string name, text;
-};
 
 int lineOf(const std::string& text, std::size_t at) {
     return 1 +
@@ -74,6 +30,7 @@ TEST(QvTaskFile, ASoundOneOpens) {
 
 TEST(QvTaskFile, AFaultHasItsPlaceAndReason) {
     const TaskFile file;
+    const std::string wav = "<str>" + file.folder.file("in.wav");
     const struct {
         const char *after, *from, *to;
         const char *path, *reason,
@@ -84,7 +41,7 @@ TEST(QvTaskFile, AFaultHasItsPlaceAndReason) {
         {"<key>files", "files", "fils", "", "'files' is missing", ""},
         {"<key>files", "filename", "name", "files/1", "'filename' is missing", "<dict>"},
         {"<key>gain", "0.5", "0,5", "gain", "it is no number", "<fl>"},
-        {"<key>rate", "\"25\"", "\"fast\"", "rate", "its 'num' is no whole number", "<framerate"},
+        {"<key>rate", "\"25\"", "\"fast\"", "rate", "its 'num' is no whole number of 32 bits", "<framerate"},
         {"<key>gain", "<key>gain</key>", "", "5", "a key is missing before this value", ""},
         {"<key>streams</key>\n  <vec>", "<str>", "<str>no", "streams/1/sources/1/file",
          "no entry of 'files' has this name", "<str>"},
@@ -92,9 +49,32 @@ TEST(QvTaskFile, AFaultHasItsPlaceAndReason) {
          "its type is not that of the output's stream", "<pair"},
         {"<key>streams</key>\n  <vec>", "<i32>2", "<i32>7", "streams/1/type",
          "it is no type of stream: 1 is video, 2 audio, 4 subpicture", "<i32>"},
-        {"<key>encoder", "rawaenc", "rawbenc", "encoder", "the output can't be made from these settings",
-         "<EncodePipe"},
-        {"<key>profile", "<i32>", "<i32>99", "encoder", "the output can't be made from these settings", ""},
+        {"<key>encoder", "rawaenc", "rawbenc", "encoder/streams/1/codec",
+         "there is no encoder 'rawbenc' here", ""},
+        {"<key>encoder", "rawaenc", "rawvenc", "encoder/streams/1/codec",
+         "there is no encoder 'rawvenc' here", ""},
+        {"<key>encoder", "\"rawmux\"", "\"rawdec\"", "encoder/muxer", "there is no multiplexer 'rawdec' here",
+         ""},
+        {"<key>filename", "</str>", "</str><key>decoder</key><dict><key>name</key><str>vawdec</str></dict>",
+         "files/1/decoder", "there is no decoder 'vawdec' here", ""},
+        {"<key>streams</key>\n  <vec>", "<key>stream</key>",
+         "<key>process</key><dict><key>filters</key><dict><key>customFilters</key><vec><dict><key>name</key>"
+         "<str>blur</str></dict></vec></dict></dict><key>stream</key>",
+         "streams/1/sources/1/process/filters/customFilters/1", "there is no filter 'blur' here", ""},
+        {"<key>profile", "<i32>3", "<i32>4", "encoder",
+         "the output can't be made from these settings: cannot restore - base profile 44996239 () not "
+         "available",
+         ""},
+        {"<Tr", "\"2.0\"", "\"new\"", "", "its version is no number", "<Tr"},
+        {"<key>gain", "<key>gain</key>", "<key>__version__</key>", "__version__", "this is no key of a file",
+         ""},
+        {"<key>files", wav.c_str(), "<str>", "files/1/filename", "the name is empty", "<str>"},
+        {"<key>streams</key>\n  <vec>", "<i32>2", "<i32>4294967298", "streams/1/type",
+         "it is no whole number of 32 bits", "<i32>"},
+        {"<key>rate", "\"25\"", "\"4294967321\"", "rate", "its 'num' is no whole number of 32 bits",
+         "<framerate"},
+        {"<key>rate", "interlaced=\"0\"", "interlaced=\"yes\"", "rate",
+         "its 'interlaced' is no whole number of 32 bits", "<framerate"},
     };
     for (const auto& row : rows) {
         const std::string changed = file.with(row.after, row.from, row.to);
