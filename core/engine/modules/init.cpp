@@ -7,6 +7,7 @@
 #include "core/engine/modules/qvregistry.h"
 #include "core/engine/qvutil.h"
 #include "core/engine/status.h"
+#include "core/engine/threads/qvthreadpool.h"
 #include "core/engine/threads/qvtimer.h"
 
 namespace {
@@ -41,6 +42,8 @@ int init_wrapper(const AnyDict* config) {
     QvRegistry* registry = qv_registry();
     if (!registry) return QvStatus::ok;
     if (config) registry->setConfig(*config);
+    if (config && config->get("threads").isInt32() && !qvSetThreads(config->get("threads").asInt32()))
+        qv_dbg()->debug("The number of threads can't be set any more, or is out of range.");
     logFolders(*registry);
     addBuiltinModules(*registry);
     return QvStatus::ok;

@@ -135,7 +135,28 @@ void QvThreadPool::run(int count, Call call, void* context) {
     if (job.failed) std::rethrow_exception(job.failed);
 }
 
+namespace {
+
+std::mutex g_settingLock;
+int g_threads = 0;  // as it was set; guarded by g_settingLock, as is the next
+bool g_made = false;
+
+int workersOfThePool() {
+    const std::lock_guard hold(g_settingLock);
+    g_made = true;
+    return (g_threads > 0 ? g_threads : qv_platform().processors()) - 1;
+}
+
+}  // namespace
+
+bool qvSetThreads(int threads) {
+    const std::lock_guard hold(g_settingLock);
+    if (threads < 0 || threads > kQvMostThreads || g_made) return false;
+    g_threads = threads;
+    return true;
+}
+
 QvThreadPool& qvThreadPool() {
-    static QvThreadPool pool(qv_platform().processors() - 1);
+    static QvThreadPool pool(workersOfThePool());
     return pool;
 }

@@ -43,5 +43,12 @@ class QV_API QvThreadPool {
     std::unique_ptr<State> state_;
 };
 
-// The engine's one pool, made on first use with one worker less than there are processors.
+// How many threads share the work on pictures, 1 to kQvMostThreads: the engine's pool has one worker less.
+// Each run has a thread of its own besides. 0: as many as there are processors, as without a call. False, and
+// nothing is changed, for another number and once the pool is there: set it before the first picture. The key
+// "threads" of init_wrapper sets the same.
+constexpr int kQvMostThreads = 256;
+QV_API bool qvSetThreads(int threads);
+
+// The engine's one pool, made on first use.
 QV_API QvThreadPool& qvThreadPool();

@@ -76,4 +76,12 @@ TEST(ThreadPool, WorksWithTheThreadsThatThereAre) {
     }
 }
 
+// How many threads a setting brings, whole runs of the tool show.
+TEST(ThreadPool, TheNumberIsSetBeforeThePoolIsThere) {
+    EXPECT_FALSE(qvSetThreads(-1));
+    EXPECT_FALSE(qvSetThreads(kQvMostThreads + 1));
+    EXPECT_GE(qvThreadPool().width(), 1);
+    EXPECT_FALSE(qvSetThreads(2));
+}
+
 }  // namespace
