@@ -30,3 +30,6 @@ install(FILES ${CMAKE_BINARY_DIR}/qvplugcore-config.cmake ${CMAKE_BINARY_DIR}/qv
 file(RELATIVE_PATH QV_PC_UP /${CMAKE_INSTALL_LIBDIR}/pkgconfig /)
 configure_file(${CMAKE_SOURCE_DIR}/cmake/qvplugcore.pc.in ${CMAKE_BINARY_DIR}/qvplugcore.pc @ONLY)
 install(FILES ${CMAKE_BINARY_DIR}/qvplugcore.pc DESTINATION ${CMAKE_INSTALL_LIBDIR}/pkgconfig)
+
+install(FILES ${CMAKE_SOURCE_DIR}/CHANGELOG.md ${CMAKE_SOURCE_DIR}/docs/progress.schema.json
+        DESTINATION ${CMAKE_INSTALL_DOCDIR})

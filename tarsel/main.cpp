@@ -10,6 +10,7 @@
 
 #include "tarsel/commands/commands.h"
 #include "tarsel/host/console.h"
+#include "tarsel/host/events.h"
 #include "tarsel/host/files.h"
 #include "tarsel/host/memory.h"
 #include "tarsel/host/outputs/transaction.h"
@@ -67,20 +68,30 @@ class Engine {
 int status(Exit exit) { return static_cast<int>(exit); }
 
 int say(Exit exit, const std::string& line) {
-    if (!line.empty()) std::fprintf(stderr, "tarsel: %s\n", line.c_str());
+    if (!line.empty()) tell(exit == Exit::done ? Level::note : Level::error, line);
+    if (exit == Exit::done) Events::get().kept();
     return status(exit);
+}
+
+CommandLine::Parsed parse(CommandLine& line, int argc, char** argv, const std::string& version) {
+    try {
+        return line.parse(argc, argv);
+    } catch (const Failure&) {
+        openEventsFor({argv, argv + argc}, version);
+        throw;
+    }
 }
 
 int run(int argc, char** argv) {
     Signals signals;
-    CommandLine line("Transcodes, inspects and draws media from the command line.",
-                     std::string("tarsel ") + QvUtil::libraryVersion().asString());
+    const std::string version = std::string("tarsel ") + QvUtil::libraryVersion().asString();
+    CommandLine line("Transcodes, inspects and draws media from the command line.", version);
     std::string log, plugins;
     bool allowUnsafePlugins = false;
     line.option("--log", log, "Write the engine's log to FILE, or to stderr", "FILE", nullptr);
     line.option("--plugins", plugins, "Load the plug-ins of FOLDER", "FOLDER", "TARSEL_PLUGINS");
     line.flag("--allow-unsafe-plugins", allowUnsafePlugins, "Load plug-ins that other users may change, too");
-    addTranscode(line, signals);
+    addTranscode(line, signals, version);
     addInfo(line);
     addCaptions(line, signals);
     addFrame(line, signals);
@@ -88,13 +99,16 @@ int run(int argc, char** argv) {
     addFormats(line);
     addPresets(line);
     addRecover(line);
-    const CommandLine::Parsed parsed = line.parse(argc, argv);
+    const CommandLine::Parsed parsed = parse(line, argc, argv, version);
     if (!parsed.action) {
         printText(parsed.text);
         flushOutput();
         return status(Exit::done);
     }
     if (!log.empty() && log != "stderr") requireOwnLog(log, {argv + 1, argv + argc});
+    if (parsed.prepare) parsed.prepare();
+    if (log == "stderr" && Events::get().descriptor() == 2)
+        throw failure(Msg::optionsExclude, {"--log stderr", "--progress json"});
     Engine engine(log, plugins, allowUnsafePlugins);
     parsed.action();
     flushOutput();
@@ -114,16 +128,13 @@ int run(int argc, char** argv) {
         reason = Msg::outOfMemory;
     } catch (...) {
     }
-    leave(status(writeToStderr(FixedLine(reason).text()) ? Exit::failed : Exit::output));
+    const int ended = status(writeToStderr(FixedLine(reason).text()) ? Exit::failed : Exit::output);
+    Events::get().endNow(ended);
+    leave(ended);
 }
 
-}  // namespace
-
-int main(int argc, char** argv) {
-    std::setlocale(LC_ALL, "C");
-    claimStreams();
-    std::set_terminate(breakOff);
-    countMemoryRefusals();
+// Every way that a command ends, as a status.
+int guarded(int argc, char** argv) {
     const MemoryWatch memory;
     try {
         return run(argc, argv);
@@ -141,4 +152,16 @@ int main(int argc, char** argv) {
     } catch (const std::exception&) {
         return say(Exit::failed, lineOf(Msg::engineFailed));
     }
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+    std::setlocale(LC_ALL, "C");
+    claimStreams();
+    std::set_terminate(breakOff);
+    countMemoryRefusals();
+    const int status = guarded(argc, argv);
+    Events::get().end(status);
+    return status;
 }

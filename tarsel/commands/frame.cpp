@@ -9,6 +9,7 @@
 #include "tarsel/commands/outputoptions.h"
 #include "tarsel/host/outputs/outputs.h"
 #include "tarsel/host/outputs/streamoutput.h"
+#include "tarsel/host/plugins.h"
 #include "tarsel/host/signals.h"
 #include "tarsel/picture/picturereader.h"
 #include "tarsel/source/source.h"
@@ -28,7 +29,8 @@ constexpr int kMostCells = 32;     // in each direction
 constexpr int kGap = 8;            // pixels between its pictures
 
 struct Given {
-    std::string input, raw, at, output, sheet;
+    std::string input, raw, at, output, sheet, threads;
+    bool strict = false;
     EffectOptions effects;
     OutputOptions outputOptions;
     std::shared_ptr<Outputs> outputs;  // null where there is a `stream`
@@ -71,9 +73,11 @@ void save(const QvFrame& picture, const Given& given) {
         if (errno != 0) throw systemFailure(Msg::outputSystem, given.output, errno);
         throw failure(Msg::outputRefused, {given.output, "the picture can't be converted to a PNG"});
     }
+    const int warnings = printWarnings() + pluginWarnings();
+    if (given.strict && warnings > 0)
+        throw failure(Msg::warningsCount, {given.output, std::to_string(warnings)});
     if (outputs) outputs->commit();
     given.signals->complete();
-    printWarnings();
     std::fprintf(stderr, "tarsel: wrote %s\n", inQuotes(given.output).c_str());
 }
 
@@ -98,17 +102,25 @@ void saveSheet(PictureReader& reader, const Given& given) {
     save(sheet, given);
 }
 
-// A cut input is refused unless the user takes what is there, as a run would do it.
-void checkDamage(const Source& source, bool acceptPartial) {
+// A cut input is refused unless the user takes what is there, as a run would do it. How many warnings it
+// made.
+int checkDamage(const Source& source, bool acceptPartial) {
     const std::string damage = source.damage();
-    if (damage.empty()) return;
+    if (damage.empty()) return 0;
     if (!acceptPartial) throw failure(Msg::inputDamaged, {source.name(), damage});
-    std::fprintf(stderr, "tarsel: warning: %s\n",
-                 lineOf(Msg::inputDamagedTaken, {source.name(), damage}).c_str());
+    tell(Level::warning, lineOf(Msg::inputDamagedTaken, {source.name(), damage}));
+    return 1;
+}
+
+MediaTime lengthOf(const Source& source) {
+    QvDecodePipe& decoder = source.decoder();
+    const auto rate = source.frameRate();
+    return rate ? MediaTime(decoder.nrFrames(0), *rate, kTicks) : decoder.duration(1, 0);
 }
 
 void frame(Given& given) {
     given.effects.check();
+    limitThreads(given.threads);
     if (!given.sheet.empty()) parseSheet(given.sheet);
     const OutputPolicy policy = given.outputOptions.policy();
     given.stream = StreamOutput::find(given.output, {given.input});
@@ -125,7 +137,8 @@ void frame(Given& given) {
     if (reader.pipe() && given.outputs) given.outputs->addInputs(filterFiles(*reader.pipe()).read);
     if (!given.sheet.empty()) return saveSheet(reader, given);
     const auto rate = source.frameRate();
-    const MediaTime at = given.at.empty() ? MediaTime(0LL, kTicks) : parseTime(given.at, rate, "--at");
+    const MediaTime at =
+        given.at.empty() ? MediaTime(0LL, kTicks) : parseInstant(given.at, rate, "--at", lengthOf(source));
     if (rate && at.position(*rate) >= source.decoder().nrFrames(0))
         throw failure(Msg::atAfterEnd, {given.at, given.input, formatTime(source.duration())});
     const long long number = rate ? at.position(reader.format().rate) : 0;
@@ -139,12 +152,15 @@ void addFrame(CommandLine& line, Signals& signals) {
     auto given = std::make_shared<Given>();
     given->signals = &signals;
     command.argument("FILE", given->input, "A file, or testgen:...");
-    command.option("--at", given->at, "The instant: SS.mmm, HH:MM:SS, 120f, HH:MM:SS:FF", "TIME");
+    command.option("--at", given->at,
+                   "The instant: SS.mmm, HH:MM:SS, 120f, HH:MM:SS:FF; -10 counts from the end", "TIME");
     command.option("--sheet", given->sheet, "A sheet of COLUMNSxROWS pictures", "NxM");
     command.option("--raw", given->raw, "Format of a raw file: size=WxH,pixel=FORMAT,rate=R", "K=V,...");
     command.option("-o,--output", given->output, "The picture; - is the standard output", "FILE.png",
                    Need::required);
     addEffectOptions(command, given->effects);
+    command.flag("--strict", given->strict, "Write nothing if there is a warning");
+    addThreads(command, given->threads);
     command.flag("--accept-partial", given->effects.acceptPartial,
                  "Take what is there of a damaged input or of damaged subtitles");
     given->outputOptions.add(command);

@@ -2,8 +2,11 @@
 
 #include <charconv>
 
+#include <qvplugcore/qvplugcore.h>
+
 #include "tarsel/words/commandline.h"
 #include "tarsel/words/messages.h"
+#include "tarsel/words/timespec.h"
 
 namespace {
 
@@ -27,14 +30,27 @@ long long parseAge(const std::string& text) {
 
 void OutputOptions::add(Command& command) {
     command.flag("-y,--overwrite", overwrite, "Overwrite existing outputs");
+    command.flag("-n,--keep", keep, "Keep existing outputs: the run then does nothing, with status 0");
     command.flag("--no-sync", noSync, "Don't wait until the disk has the outputs");
     command.option("--stale", stale,
                    "Age after which what another host's run left goes: 90m, 12h, 30d, never (7d)", "AGE");
 }
 
 OutputPolicy OutputOptions::policy() const {
+    if (overwrite && keep) throw failure(Msg::optionsExclude, {"-y", "-n"});
     OutputPolicy policy(overwrite);
+    policy.keep = keep;
     policy.sync = !noSync;
     if (!stale.empty()) policy.stale = parseAge(stale);
     return policy;
+}
+
+void addThreads(Command& command, std::string& threads) {
+    command.option("--threads", threads, "Threads that share the work on pictures (one for each processor)",
+                   "N");
+}
+
+void limitThreads(const std::string& threads) {
+    if (!threads.empty())
+        qvSetThreads(static_cast<int>(parseNumber(threads, 1, kQvMostThreads, "--threads")));
 }

@@ -8,10 +8,15 @@
 class Command;
 
 struct OutputOptions {
-    bool overwrite = false, noSync = false;
+    bool overwrite = false, keep = false, noSync = false;
     std::string stale;
 
     void add(Command& command);
     // Throws Failure (usage).
     OutputPolicy policy() const;
 };
+
+// --threads: how many threads of the engine share the work on pictures.
+void addThreads(Command& command, std::string& threads);
+// Throws Failure (usage). Before the first picture.
+void limitThreads(const std::string& threads);

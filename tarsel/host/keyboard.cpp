@@ -1,5 +1,6 @@
 #include "tarsel/host/keyboard.h"
 
+#include <mutex>
 #include <system_error>
 
 #include <fcntl.h>
@@ -7,36 +8,73 @@
 #include <termios.h>
 #include <unistd.h>
 
-// Keys arrive one by one while the object lives; then the terminal is as it was.
+namespace {
+
+std::mutex g_lock;  // of the mode of the terminal
+
+}  // namespace
+
+// Keys arrive one by one while the terminal is taken.
 struct Keyboard::Terminal {
     int device = -1;
     int wake[2] = {-1, -1};
     termios former{};
+    std::atomic<bool> taken{false};
 
     ~Terminal() {
         if (device < 0) return;
-        tcsetattr(device, TCSANOW, &former);
+        giveBack();
         for (int fd : {device, wake[0], wake[1]})
             if (fd >= 0) close(fd);
     }
 
+    bool inForeground() const { return tcgetpgrp(device) == getpgrp(); }
+
     bool open() {
         device = ::open("/dev/tty", O_RDONLY | O_CLOEXEC | O_NOCTTY);
         if (device < 0) return false;
-        if (tcgetpgrp(device) != getpgrp() || tcgetattr(device, &former) != 0 ||
-            pipe2(wake, O_CLOEXEC) != 0) {
+        if (!inForeground() || pipe2(wake, O_CLOEXEC) != 0) {
             close(device);
             device = -1;
             return false;
         }
+        return take();
+    }
+
+    bool take() {
+        if (taken || !inForeground() || tcgetattr(device, &former) != 0) return false;
         termios keys = former;
         keys.c_lflag &= ~static_cast<tcflag_t>(ICANON | ECHO);
-        tcsetattr(device, TCSANOW, &keys);
-        return true;
+        taken = tcsetattr(device, TCSANOW, &keys) == 0;
+        return taken && tellListener('c');
     }
+
+    void giveBack() {
+        if (!taken.exchange(false)) return;
+        tellListener('c');
+        if (inForeground()) tcsetattr(device, TCSANOW, &former);
+    }
+
+    // 'c': it has changed hands; 'e': the end.
+    bool tellListener(char what) const { return write(wake[1], &what, 1) == 1; }
 };
 
-Keyboard::Keyboard(bool enabled, std::function<void()> pressed) : pressed_(std::move(pressed)) {
+Keyboard::Terminal*& Keyboard::current() {
+    static Terminal* terminal = nullptr;
+    return terminal;
+}
+
+void Keyboard::giveBack() {
+    const std::lock_guard guard(g_lock);
+    if (current()) current()->giveBack();
+}
+
+void Keyboard::take() {
+    const std::lock_guard guard(g_lock);
+    if (current()) current()->take();
+}
+
+Keyboard::Keyboard(bool enabled, std::function<void(char)> pressed) : pressed_(std::move(pressed)) {
     if (!enabled) return;
     terminal_ = std::make_unique<Terminal>();
     try {
@@ -45,19 +83,31 @@ Keyboard::Keyboard(bool enabled, std::function<void()> pressed) : pressed_(std::
         // A job that gets by without a thread for keys needs no keys.
     }
     if (!thread_.joinable()) terminal_.reset();
+    if (!terminal_) return;
+    const std::lock_guard guard(g_lock);
+    current() = terminal_.get();
 }
 
 Keyboard::~Keyboard() {
     if (!thread_.joinable()) return;
-    const char end = 0;
-    if (write(terminal_->wake[1], &end, 1) == 1) thread_.join();
+    {
+        const std::lock_guard guard(g_lock);
+        current() = nullptr;
+    }
+    if (terminal_->tellListener('e')) thread_.join();
 }
 
 void Keyboard::listen() {
-    pollfd watched[] = {{terminal_->device, POLLIN, 0}, {terminal_->wake[0], POLLIN, 0}};
-    while (poll(watched, 2, -1) >= 0 && !(watched[1].revents & POLLIN)) {
+    pollfd watched[] = {{terminal_->wake[0], POLLIN, 0}, {terminal_->device, POLLIN, 0}};
+    // In the background a read of the terminal would stop the process.
+    while (poll(watched, terminal_->taken ? 2 : 1, -1) >= 0) {
         char key = 0;
-        if ((watched[0].revents & POLLIN) && read(terminal_->device, &key, 1) == 1 && key == 'p') pressed_();
-        if (watched[0].revents & (POLLHUP | POLLERR)) return;
+        if (watched[0].revents & POLLIN) {
+            if (read(watched[0].fd, &key, 1) != 1 || key == 'e') return;
+        } else if ((watched[1].revents & POLLIN) && terminal_->taken && terminal_->inForeground()) {
+            if (read(watched[1].fd, &key, 1) == 1) pressed_(key);
+        } else if (watched[1].revents & (POLLHUP | POLLERR)) {
+            return;
+        }
     }
 }

@@ -10,6 +10,7 @@
 
 #include <qvplugcore/qvplugcore.h>
 
+#include "tarsel/host/events.h"
 #include "tarsel/host/files.h"
 #include "tarsel/host/terminal.h"
 #include "tarsel/words/fixedline.h"
@@ -21,7 +22,7 @@ int g_warnings = 0;
 
 void warn(const std::string& line) {
     ++g_warnings;
-    std::fprintf(stderr, "tarsel: warning: %s\n", line.c_str());
+    tell(Level::warning, line);
 }
 
 constexpr std::array kCrashes = {

@@ -8,7 +8,8 @@
 #include <signal.h>
 #include <unistd.h>
 
-#include "tarsel/host/terminal.h"
+#include "tarsel/host/events.h"
+#include "tarsel/host/keyboard.h"
 #include "tarsel/words/fixedline.h"
 
 namespace {
@@ -21,7 +22,7 @@ std::atomic<bool> g_complete{false};
 sigset_t handledSignals() {
     sigset_t set;
     sigemptyset(&set);
-    for (int number : {SIGINT, SIGTERM, SIGHUP, SIGUSR1}) {
+    for (int number : {SIGINT, SIGTERM, SIGHUP, SIGUSR1, SIGTSTP, SIGCONT}) {
         struct sigaction action {};
         // What the caller ignores, as nohup does, stays ignored.
         if (sigaction(number, nullptr, &action) == 0 && action.sa_handler != SIG_IGN) sigaddset(&set, number);
@@ -44,14 +45,6 @@ bool succeeds(Handler handler) {
     }
 }
 
-// In one write, so that nothing stands in between.
-void tell(const Signals::Handlers& handlers) {
-    if (stderrHasRoom())
-        writeToStderr(FixedLine(handlers.last.value_or(handlers.second ? Msg::stoppedWithNothing : Msg::stopped),
-                                {handlers.file})
-                          .text());
-}
-
 }  // namespace
 
 // Runs for the life of the process, so it is detached: a signal may come until the very end.
@@ -60,23 +53,56 @@ void Signals::wait() {
     for (int signal = 0;;) {
         if (sigwait(&set, &signal) != 0) continue;
         std::lock_guard guard(g_lock);
-        if (signal != SIGUSR1)
-            stop(signal);
-        else if (g_innermost && g_innermost->handlers_.report)
-            succeeds([] { g_innermost->handlers_.report(); });
+        const Handlers none;
+        const Handlers& now = g_innermost ? g_innermost->handlers_ : none;
+        const auto call = [](const std::function<void()>& handler) {
+            if (handler) succeeds(handler);
+        };
+        switch (signal) {
+            case SIGUSR1: call(now.report); break;
+            case SIGTSTP:
+                call(now.suspend);
+                Keyboard::giveBack();
+                suspend();
+                [[fallthrough]];  // it was continued, or could not be stopped
+            case SIGCONT:
+                call(now.resume);
+                Keyboard::take();
+                break;
+            default: stop(signal);
+        }
     }
+}
+
+// By the default action, which is none where no shell could continue the process.
+void Signals::suspend() {
+    sigset_t stops;
+    sigemptyset(&stops);
+    sigaddset(&stops, SIGTSTP);
+    pthread_sigmask(SIG_UNBLOCK, &stops, nullptr);
+    raise(SIGTSTP);
+    pthread_sigmask(SIG_BLOCK, &stops, nullptr);
+}
+
+void Signals::interrupt() {
+    struct sigaction action {};
+    const bool ignored = sigaction(SIGINT, nullptr, &action) == 0 && action.sa_handler == SIG_IGN;
+    kill(getpid(), ignored ? SIGTERM : SIGINT);
 }
 
 void Signals::stop(int signal) {
     const bool again = g_received.exchange(signal) != 0;
+    Events::get().hurry();
     const Handlers none;
     const Handlers& now = g_innermost ? g_innermost->handlers_ : none;
     if (g_complete && !again) return;
     if (!again && now.first && succeeds([&] { now.first(signal); })) return;
     bool complete = g_complete;
     if (!complete && now.second) succeeds([&] { complete = now.second(); });
-    if (!complete) tell(now);
-    _exit(static_cast<int>(complete ? Exit::done : statusOf(signal)));
+    const int status = static_cast<int>(complete ? Exit::done : statusOf(signal));
+    const Msg last = now.last.value_or(now.second ? Msg::stoppedWithNothing : Msg::stopped);
+    lastWords(complete ? std::string_view() : FixedLine(last, {now.file}).text(), status);
+    _exit(status);
 }
 
 Signals::Signals() {

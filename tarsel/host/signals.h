@@ -1,5 +1,5 @@
-// SIGINT, SIGTERM, SIGHUP and SIGUSR1, handled on a thread of their own so that the handling is ordinary
-// code.
+// SIGINT, SIGTERM, SIGHUP, SIGUSR1, SIGTSTP and SIGCONT, handled on a thread of their own so that the
+// handling is ordinary code.
 #pragma once
 
 #include <functional>
@@ -19,6 +19,8 @@ class Signals {
         // if this answers that the work was complete, else with that of the signal.
         std::function<bool()> second;
         std::function<void()> report = {};  // on SIGUSR1, as often as it comes
+        // Before SIGTSTP (Ctrl-Z) stops the process, and on SIGCONT, also after another signal that stops.
+        std::function<void()> suspend = {}, resume = {};
         // What is said when the process ends at once before the work is complete; without it that no output
         // was written, if there is a `second` to see to that. `file`: the name in it.
         std::optional<Msg> last = {};
@@ -50,6 +52,8 @@ class Signals {
     Exit received() const;
 
     int number() const;  // of the signal; 0 when none came
+    // As if the user had typed Ctrl-C.
+    static void interrupt();
 
     // The result has its name, and no signal changes the status any more: the first is ignored, so that what
     // is left to say is said, and the next one ends the process with status 0.
@@ -59,4 +63,5 @@ class Signals {
   private:
     static void wait();
     static void stop(int signal);
+    static void suspend();
 };

@@ -180,21 +180,30 @@ void Job::checkDamage() {
     }
 }
 
+// By --no-video and --no-audio.
+bool Job::unwanted(int type) const { return type == kVideo ? options_.noVideo : options_.noAudio; }
+
 void Job::planStreams() {
     for (const auto& source : sources_)
         for (int type : {kVideo, kAudio}) {
-            if (type == kVideo && kind_ == OutputKind::wav) continue;
+            if (unwanted(type) || (type == kVideo && kind_ == OutputKind::wav)) continue;
             if (takesOneStream() && !streams_.empty()) continue;
             for (int i = 0; i < source->decoder().nrStreams(type); ++i) planStream(*source, type, i);
         }
+    if (streams_.empty() && (options_.noVideo || options_.noAudio))
+        throw failure(Msg::inputUnwanted, {options_.noAudio ? "--no-audio" : "--no-video", outputName()});
     if (streams_.empty())
         throw failure(kind_ == OutputKind::wav ? Msg::inputNoSound : Msg::inputNoStreams, {outputName()});
     if (kind_ == OutputKind::byInput) kind_ = hasVideo() ? OutputKind::raw : OutputKind::wav;
     checkPicture();
     if (outputs_) checkCounts();
     // As captions, of which raw pictures hold none.
+    const auto isLeft = [&](const Source& source, int type) {
+        return unwanted(type) && source.decoder().nrStreams(type) > 0;
+    };
     for (const auto& source : sources_)
-        if (std::none_of(streams_.begin(), streams_.end(),
+        if (!isLeft(*source, kVideo) && !isLeft(*source, kAudio) &&
+            std::none_of(streams_.begin(), streams_.end(),
                          [&](const auto& s) { return s.source == source.get(); }))
             warnings_.push_back(lineOf(Msg::inputUnused, {source->name()}));
 }
@@ -257,30 +266,42 @@ MediaTime Job::endOf(const JobStream& stream) {
     return before ? end + MediaTime(1) : end;
 }
 
+bool Job::takesPart() const {
+    return !options_.from.empty() || !options_.to.empty() || !options_.duration.empty();
+}
+
+// Times from the end count from that of the picture, so that all streams keep together.
 void Job::planPoints() {
     const auto picture = std::find_if(streams_.begin(), streams_.end(),
                                       [](const JobStream& stream) { return stream.type == kVideo; });
-    for (JobStream& stream : streams_) {
-        // Frames beside a sound of its own file are those of the picture.
-        auto rate = stream.source->frameRate();
-        if (!rate && picture != streams_.end()) rate = picture->source->frameRate();
-        const MediaTime length = endOf(stream);
-        const std::string end = formatTime(length.seconds());
-        stream.in = MediaTime(0LL, kTicks);
-        stream.out = length;
-        if (!options_.from.empty()) stream.in = parseTime(options_.from, rate, "--from");
-        if (!options_.to.empty()) stream.out = parseTime(options_.to, rate, "--to");
-        if (stream.out <= stream.in && !options_.to.empty())
-            throw failure(Msg::toNotAfter,
-                          {options_.to, options_.from.empty() ? "the start" : "--from " + options_.from});
-        if (stream.in >= length && !options_.from.empty())
-            throw failure(Msg::fromAfterEnd, {options_.from, stream.source->name(), end});
-        if (stream.out > length) {
-            if (stream.type == kVideo || !hasVideo())
-                warnings_.push_back(lineOf(Msg::toAfterEnd, {options_.to, stream.source->name(), end}));
-            stream.out = length;
-        }
-    }
+    const JobStream& leading = picture != streams_.end() ? *picture : streams_.front();
+    for (JobStream& stream : streams_) planPoint(stream, leading);
+}
+
+void Job::planPoint(JobStream& stream, const JobStream& leading) {
+    // Frames beside a sound of its own file are those of the picture.
+    auto rate = stream.source->frameRate();
+    if (!rate && leading.type == kVideo) rate = leading.source->frameRate();
+    const MediaTime length = endOf(stream), whole = endOf(leading);
+    const std::string end = formatTime(length.seconds());
+    const std::string start = options_.from.empty() ? "the start" : "--from " + options_.from;
+    stream.in = MediaTime(0LL, kTicks);
+    stream.out = length;
+    if (!options_.from.empty()) stream.in = parseInstant(options_.from, rate, "--from", whole);
+    if (!options_.to.empty()) stream.out = parseInstant(options_.to, rate, "--to", whole);
+    if (!options_.duration.empty()) stream.out = parseSpan(options_.duration, rate, "--duration", stream.in);
+    if (stream.out <= stream.in && !options_.to.empty()) throw failure(Msg::toNotAfter, {options_.to, start});
+    if (stream.out <= stream.in && !options_.duration.empty())
+        throw failure(Msg::durationNone, {options_.duration});
+    if (stream.in >= length && !options_.from.empty())
+        throw failure(Msg::fromAfterEnd, {options_.from, stream.source->name(), end});
+    if (stream.out <= length) return;
+    if (stream.type == kVideo || !hasVideo())
+        warnings_.push_back(
+            options_.to.empty()
+                ? lineOf(Msg::durationAfterEnd, {options_.duration, start, stream.source->name(), end})
+                : lineOf(Msg::toAfterEnd, {options_.to, stream.source->name(), end}));
+    stream.out = length;
 }
 
 void Job::planLengths() {
@@ -459,8 +480,7 @@ void Job::checkEffects() const {
 void Job::planFilters() {
     checkEffects();
     for (JobStream& stream : streams_) {
-        if (!options_.from.empty() || !options_.to.empty())
-            stream.params.setInOutPoints(InOutPoints(stream.in, stream.out));
+        if (takesPart()) stream.params.setInOutPoints(InOutPoints(stream.in, stream.out));
         stream.type == kVideo ? planPicture(stream) : planSound(stream);
     }
     takeWarnings();

@@ -23,12 +23,14 @@
 
 struct JobOptions {
     std::vector<std::string> inputs;
-    std::string output, format, raw, from, to, muxer, post, saveTask;
+    std::string output, format, raw, from, to, duration, muxer, post, saveTask;
     EffectOptions effects;
     std::optional<int> samplerate, channels, bits;
-    ProgressMode progress = ProgressMode::automatic;
+    ProgressMode progress;
     OutputPolicy policy{false};
     bool splitChannels = false, dryRun = false, acceptPartial = false, quiet = false;
+    bool noVideo = false, noAudio = false;
+    bool strict = false;                // warnings are failures
     std::vector<std::string> warnings;  // of earlier attempts
 };
 
@@ -71,6 +73,8 @@ class Job {
     Job(const JobOptions& options, Signals& signals);
     ~Job();
 
+    // Throws Failure if a warning is one.
+    void checkWarnings() const;
     // Writes the task file if there is to be one, and prints the plan to the standard output.
     void plan();
     // Runs, checks and commits. Throws Failure.
@@ -90,8 +94,11 @@ class Job {
     void checkStream() const;
     void planStreams();
     void planStream(Source& source, int type, int number);
+    bool unwanted(int type) const;
     static MediaTime endOf(const JobStream& stream);
+    bool takesPart() const;
     void planPoints();
+    void planPoint(JobStream& stream, const JobStream& leading);
     void planLengths();
     void planFilters();
     void planPicture(JobStream& stream);
@@ -127,7 +134,7 @@ class Job {
     void checkTaken() const;
     long long taken() const;  // bytes, by a stream
     void report(const std::vector<std::string>& names) const;
-    void runPost(const std::vector<std::string>& names, Progress& progress, ProgressState state) const;
+    void runPost(const std::vector<std::string>& names) const;
     void showWarnings() const;
     std::string primaryExtension() const;
     const std::string& outputName() const;  // for messages

@@ -9,6 +9,7 @@
 #include <optional>
 
 #include "tarsel/host/command.h"
+#include "tarsel/host/events.h"
 #include "tarsel/host/keyboard.h"
 #include "tarsel/host/memory.h"
 #include "tarsel/host/plugins.h"
@@ -57,7 +58,10 @@ class Job::Runner : public QvTranscoder {
         return 0;
     }
 
-    void cbPaused(bool paused) override { progress_.show(state(paused ? "paused" : "running")); }
+    void cbPaused(bool paused) override {
+        paused ? progress_.time().pause() : progress_.time().resume();
+        progress_.show(state(paused ? "paused" : "running"));
+    }
 
     void cbDone(int result) override {
         std::lock_guard guard(lock_);
@@ -99,7 +103,12 @@ class Job::Runner : public QvTranscoder {
         return *errorDesc() ? errorDesc() : "the engine gives no reason";
     }
 
-    void togglePause() { isPaused() ? unpause() : pause(); }
+    // On the thread of the keyboard.
+    void pressed(char key) {
+        if (key == 'p') isPaused() ? unpause() : pause();
+        if (key == 'q') Signals::interrupt();
+        if (key == '?') progress_.say("tarsel: keys: p pauses and resumes, q stops the job, ? shows this");
+    }
 
     ProgressState state(const char* name) const {
         if (!first_) return {.state = name};
@@ -191,9 +200,9 @@ int Job::runLinked(Runner& runner, Progress& progress) {
     if (result == QvStatus::failed && runner.isTranscoding())
         throw failure(Msg::runHasNoThread, {options_.output});
     if (result == QvStatus::ok || result == QvStatus::warning) {
-        Keyboard keyboard(progress.onTerminal(), [&] { runner.togglePause(); });
+        Keyboard keyboard(progress.onTerminal(), [&](char key) { runner.pressed(key); });
         result = runner.wait([&] {
-            if (!options_.quiet) writeToStderr(FixedLine(Msg::stopping).text());
+            if (!options_.quiet) tell(Level::note, lineOf(Msg::stopping));
         });
     }
     ProgressState end = runner.last();
@@ -203,7 +212,7 @@ int Job::runLinked(Runner& runner, Progress& progress) {
 }
 
 void Job::run() {
-    Progress progress(options_.quiet ? ProgressMode::off : options_.progress, "task 1 of 1  ");
+    Progress progress(options_.progress, options_.quiet, "task 1 of 1  ");
     std::vector<std::string> names;
     // What has begun to take its place is neither left half-way nor taken back.
     const auto leave = [&] { return files_->leave(); };
@@ -213,13 +222,14 @@ void Job::run() {
     checkSpace();
     storeTask();
     redirectFilters();
-    ProgressState end;
     {
         const MemoryWatch memory;
         Runner runner(*this, progress);
         const Signals::Watch running(signals_, {.first = [&](int) { runner.requestStop(); },
                                                 .second = leave,
                                                 .report = [&] { runner.report(); },
+                                                .suspend = [&] { progress.time().stopping(); },
+                                                .resume = [&] { progress.time().continued(); },
                                                 .last = last,
                                                 .file = options_.output});
         try {
@@ -235,13 +245,15 @@ void Job::run() {
         }
         checkLengths();
         takeWarnings();
+        if (const std::string lost = Events::get().lost(); !lost.empty()) warnings_.push_back(lost);
         checkResult();
         stopIfSignalled();
-        end = runner.last();
+        checkWarnings();
         commit();
     }
     if (outputs_) names = outputs_->names();
     if (stream_) names = {stream_->name()};
+    Events::get().wrote(names);
     if (options_.post.empty()) signals_.complete();
     // The result is there, whether or not there is memory to say so.
     try {
@@ -250,7 +262,7 @@ void Job::run() {
     } catch (const std::bad_alloc&) {
         writeToStderr(FixedLine(Msg::doneUnsaid).text());
     }
-    if (!options_.post.empty()) runPost(names, progress, end);
+    if (!options_.post.empty()) runPost(names);
     signals_.complete();
 }
 
@@ -359,9 +371,16 @@ void Job::fail(Runner& runner, int result) const {
     throw failure(Msg::jobFailed, {outputName(), withFinalNames(reason)});
 }
 
+void Job::checkWarnings() const {
+    const int count = static_cast<int>(warnings_.size()) + pluginWarnings();
+    if (!options_.strict || count == 0) return;
+    showWarnings();
+    throw failure(Msg::warningsCount, {outputName(), std::to_string(count)});
+}
+
 void Job::showWarnings() const {
     if (options_.quiet) return;
-    for (const auto& warning : warnings_) std::fprintf(stderr, "tarsel: warning: %s\n", warning.c_str());
+    for (const auto& warning : warnings_) tell(Level::warning, warning);
 }
 
 void Job::report(const std::vector<std::string>& names) const {
@@ -373,22 +392,24 @@ void Job::report(const std::vector<std::string>& names) const {
                 (s.written == 1 ? "" : "s");
     const std::size_t warnings = warnings_.size() + static_cast<std::size_t>(pluginWarnings());
     if (warnings > 0) line += " (" + std::to_string(warnings) + (warnings == 1 ? " warning)" : " warnings)");
-    std::fprintf(stderr, "tarsel: %s\n", line.c_str());
+    tell(Level::note, line);
 }
 
-void Job::runPost(const std::vector<std::string>& names, Progress& progress, ProgressState state) const {
+void Job::runPost(const std::vector<std::string>& names) const {
     const std::string first = names.empty() ? options_.output : names.front();
     const auto stopWith = [&](Exit signalled, Msg why) { throw Failure(signalled, lineOf(why, {first})); };
     if (const Exit signalled = signals_.received(); signalled != Exit::done)
         stopWith(signalled, Msg::stoppedBeforePost);
     std::string line = postCommand(options_.post, options_.inputs, names);
-    // The standard output has the result, and nothing else goes there.
-    if (stream_ && stream_->isStandardOutput()) line.insert(0, "exec 1>&2\n");
-    state.state = "post";
-    const auto report = [&] {
-        if (progress.isJson()) return progress.report(state);
-        writeToStderr(FixedLine(Msg::postRuns).text());
-    };
+    // The standard output that has the result, and a stream that has the objects of --progress, get nothing
+    // else.
+    const int objects = Events::get().descriptor();
+    const bool noOutput = objects == 1 || (stream_ && stream_->isStandardOutput()), noErrors = objects == 2;
+    if (noOutput || noErrors)
+        line.insert(0, noOutput && noErrors ? "exec >/dev/null 2>&1\n"
+                       : noOutput           ? "exec 1>&2\n"
+                                            : "exec 2>&1\n");
+    const auto report = [] { tell(Level::note, lineOf(Msg::postRuns)); };
     // What comes while the command starts is answered as well.
     const Signals::Watch starting(
         signals_, {.first = [](int) {}, .second = [&] { return files_->leave(); }, .report = report});

@@ -1,9 +1,12 @@
-// What a person or a program sees while a job runs: one line on a terminal, JSON lines, or nothing.
+// What a person or a program sees while a job runs: one line on a terminal, a line now and then in a log,
+// objects, or nothing.
 #pragma once
 
 #include <atomic>
 #include <mutex>
 #include <string>
+
+#include "tarsel/host/events.h"
 
 struct ProgressState {
     double part = -1;       // 0 to 1; negative when unknown
@@ -13,39 +16,73 @@ struct ProgressState {
     const char* state = "running";
 };
 
-enum class ProgressMode { automatic, json, off };
+// --progress.
+struct ProgressMode {
+    enum class How { automatic, json, log, off };
+    How how = How::automatic;
+    std::string target;      // of json: see Events::open
+    double logSeconds = 10;  // between two lines of a log
+};
+// "auto", "none", "json", "json:3", "json:FILE", "log", "log:SECONDS". Throws Failure (usage).
+ProgressMode parseProgress(const std::string& text);
+
+// The time for which a job has been running: not while it was paused or the process was stopped. From any
+// thread.
+class RunningTime {
+  public:
+    void start();
+    // That the job is at work; returns the seconds of the system's counter.
+    double tick();
+    void pause();
+    void resume();
+    // The process is about to be stopped, and was continued. If no one knew before, it was stopped from the
+    // last tick on.
+    void stopping();
+    void continued();
+
+    double seconds() const;
+
+  private:
+    mutable std::mutex lock_;
+    std::atomic<double> tick_{0};
+    double begin_ = 0, away_ = 0;
+    double paused_ = -1, stopped_ = -1;  // since then; negative for not
+    double longStep_ = 0,
+           longStepEnd_ = -1;  // between two ticks, and when the second was; negative for never
+};
 
 class Progress {
   public:
-    // Automatic: a line when the standard error is a terminal, otherwise nothing. `label` stands in front.
-    Progress(ProgressMode mode, std::string label);
+    // Automatic: a line when the standard error is a terminal, otherwise a log; `quiet` leaves only objects.
+    // `label` is in front.
+    Progress(const ProgressMode& mode, bool quiet, std::string label);
     ~Progress();
 
     void start();
     // Cheap: shows something only when the last time is long enough ago.
     void update(const ProgressState& state);
-    bool due() const;
-    // Shows it at once.
-    void show(const ProgressState& state) {
-        if (json_ || line_) show("progress", state);
-    }
-    // Prints it once, whatever the mode: an object in JSON, otherwise a line that stays. From any thread.
+    bool due();
+    // Shows it at once, except in a log.
+    void show(const ProgressState& state);
+    // Prints it once, whatever the mode: an object, otherwise a line that stays. From any thread.
     void report(const ProgressState& state);
-    // Sends the last event; the line goes.
+    // A line that stays, above the one that changes. From any thread.
+    void say(const std::string& line);
+    // The line goes.
     void finish(const ProgressState& state);
     bool onTerminal() const { return line_; }
-    bool isJson() const { return json_; }
+    RunningTime& time() { return time_; }
 
   private:
-    void show(const char* event, const ProgressState& state);
-    void showLine(const ProgressState& state, double elapsed, double eta);
-    std::string line(const ProgressState& state, double elapsed, double eta, bool color) const;
-    void showJson(const char* event, const ProgressState& state, double elapsed, double eta);
+    void showLine(const ProgressState& state);
+    std::string line(const ProgressState& state, bool color) const;
+    JobFigures figures(const ProgressState& state) const;
 
     std::string label_;
-    bool line_ = false, json_ = false, color_ = false;
-    std::mutex lock_;  // of what is shown
+    bool line_ = false, json_ = false, log_ = false, color_ = false;
+    double interval_ = 0;  // seconds
+    std::mutex lock_;      // of what is shown
     bool shown_ = false;
-    double begin_ = 0, end_ = 0;   // seconds of the system's counter; 0 before
-    std::atomic<double> last_{0};  // likewise
+    RunningTime time_;
+    std::atomic<double> last_{0};  // seconds of the system's counter
 };

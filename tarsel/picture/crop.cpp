@@ -1,8 +1,8 @@
 // --crop: which part of a picture is kept.
 #include <charconv>
-#include <cmath>
 
 #include "tarsel/picture/overlays.h"
+#include "tarsel/picture/sizes.h"
 #include "tarsel/words/messages.h"
 #include "tarsel/words/timespec.h"
 
@@ -11,21 +11,6 @@ namespace {
 constexpr int kLeast = 4;  // pixels that have to be left
 
 std::string sizeText(int width, int height) { return std::to_string(width) + "x" + std::to_string(height); }
-
-// What a cut keeps together: pixels that share their chroma, and in interlaced pictures the fields.
-struct Grid {
-    int columns, rows;
-};
-
-Grid gridOf(const PictureFormat& picture) {
-    const QvPixelFormat* format = qvPixelFormat(picture.fourcc);
-    if (!format) return {1, 1};
-    const bool quarter = format->chroma == QvChroma::quarter;
-    const bool pairs = quarter || format->chroma == QvChroma::half || format->group == 'y' ||
-                       format->fourcc == QvFourcc::Y216 || format->fourcc == QvFourcc::v210;
-    const int fields = picture.rate.interlaced() ? 2 : 1;
-    return {pairs ? 2 : 1, (quarter ? 2 : 1) * fields};
-}
 
 // "+20" and "-20" of "+20-20": the distance of a box from one edge or the other.
 int takeOffset(std::string_view& rest, int room, const std::string& text) {
@@ -44,18 +29,9 @@ QvRect ofAspect(const std::string& text, size_t colon, const PictureFormat& pict
     const auto part = [](std::string_view digits) { return parseNumber(digits, 1, 10000, "--crop"); };
     const double wanted = static_cast<double>(part(std::string_view(text).substr(0, colon))) /
                           static_cast<double>(part(std::string_view(text).substr(colon + 1)));
-    int width = picture.width, height = picture.height;
-    if (wanted < picture.aspect)
-        width = static_cast<int>(std::lround(width * wanted / picture.aspect));
-    else
-        height = static_cast<int>(std::lround(height * picture.aspect / wanted));
-    const Grid grid = gridOf(picture);
-    width = width / grid.columns * grid.columns;
-    height = height / grid.rows * grid.rows;
-    if (width < kLeast || height < kLeast) throw failure(Msg::cropEmpty, {text});
-    const int x = (picture.width - width) / 2 / grid.columns * grid.columns;
-    const int y = (picture.height - height) / 2 / grid.rows * grid.rows;
-    return QvRect(x, y, x + width, y + height);
+    const QvRect box = partOfShape(wanted, picture);
+    if (box.width() < kLeast || box.height() < kLeast) throw failure(Msg::cropEmpty, {text});
+    return box;
 }
 
 void check(const std::string& text, const QvRect& box, const PictureFormat& picture) {

@@ -1,6 +1,8 @@
 #include "tarsel/picture/effects.h"
 
+#include "tarsel/picture/sizes.h"
 #include "tarsel/words/commandline.h"
+#include "tarsel/words/messages.h"
 #include "tarsel/words/timespec.h"
 
 std::string EffectOptions::given() const {
@@ -9,6 +11,7 @@ std::string EffectOptions::given() const {
         bool given;
     } all[] = {
         {"--size", !size.empty()},
+        {"--fit", !fit.empty()},
         {"--rate", !rate.empty()},
         {"--pixel", !pixel.empty()},
         {"--matrix", !matrix.empty()},
@@ -29,14 +32,19 @@ std::string EffectOptions::given() const {
 bool EffectOptions::any() const { return !given().empty() || !filters.empty(); }
 
 void EffectOptions::check() const {
-    if (!size.empty()) parseSize(size, "--size");
+    if (!size.empty() && !fit.empty()) throw failure(Msg::optionsExclude, {"--size", "--fit"});
+    if (!size.empty()) parseSizeOrShape(size, "--size");
+    if (!fit.empty()) parseFit(fit);
     if (!rate.empty()) parseRate(rate, "--rate");
     if (!pixel.empty()) parsePixel(pixel, "--pixel");
 }
 
 void addEffectOptions(Command& command, EffectOptions& options) {
     command.group("Picture");
-    command.option("--size", options.size, "Size of the output", "WxH");
+    command.option("--size", options.size, "Size of the output; 1280x-1 and -1x720 keep the shape", "WxH");
+    command.option("--fit", options.fit,
+                   "The largest size in a box; bars fills the rest with black, crop cuts what is beyond it",
+                   "WxH[,bars|crop]");
     command.option("--rate", options.rate, "Frames a second: 25, 30000/1001, 25i", "RATE");
     command.option("--pixel", options.pixel, "Pixel format, see 'tarsel formats'", "FOURCC");
     command.option("--matrix", options.matrix, "YUV matrix of the output, or of input and output",

@@ -8,7 +8,7 @@ class Command;
 
 // As they were given; empty when they were not.
 struct EffectOptions {
-    std::string size, rate, pixel, matrix;
+    std::string size, fit, rate, pixel, matrix;
     std::string deinterlace, crop, fade, timecode, subtitles, subtitleStyle;
     std::vector<std::string> logos, filters;
     bool flip = false;

@@ -8,6 +8,7 @@
 #include "tarsel/host/files.h"
 #include "tarsel/host/memory.h"
 #include "tarsel/picture/overlays.h"
+#include "tarsel/picture/sizes.h"
 #include "tarsel/words/keyvalues.h"
 #include "tarsel/words/messages.h"
 #include "tarsel/words/rawnames.h"
@@ -18,6 +19,7 @@ namespace {
 
 constexpr int kVideo = 1, kAudio = 2;
 constexpr int kVideoFilter = 12, kAudioFilter = 13, kVideoEncoder = 7;
+constexpr int kLeastPart = 4;  // pixels of a side that --fit has to leave
 
 // The format in which the encoder of an output wants its frames; BGR3 if it can't write that output.
 unsigned frameFormat(unsigned fourcc) {
@@ -128,16 +130,11 @@ PictureEffects::PictureEffects(const EffectOptions& options, const Source& sourc
     out_ = in_;
     planDeinterlace();
     planCrop();
-    if (!options_.size.empty()) {
-        const Size size = parseSize(options_.size, "--size");
-        out_.width = size.width;
-        out_.height = size.height;
-    }
     planRate();
     if (!options_.pixel.empty()) out_.fourcc = parsePixel(options_.pixel, "--pixel");
     planMatrix(toPng);
+    planSize();
     if (options_.subtitles.empty() && !options_.subtitleStyle.empty()) throw failure(Msg::styleAlone);
-    if (!options_.size.empty()) requireFrame("--size", frameFormat(out_.fourcc), out_.width, out_.height);
 }
 
 void PictureEffects::planDeinterlace() {
@@ -178,6 +175,46 @@ void PictureEffects::planCrop() {
     out_.width = crop_->width();
     out_.height = crop_->height();
     out_.aspect *= static_cast<double>(crop_->width()) / in_.width * in_.height / crop_->height();
+}
+
+void PictureEffects::planSize() {
+    if (!options_.fit.empty()) planFit();
+    if (!options_.size.empty()) {
+        const Size size = scaledSize(options_.size, out_);
+        out_.width = size.width;
+        out_.height = size.height;
+    }
+    if (!options_.size.empty() || !options_.fit.empty())
+        requireFrame(options_.fit.empty() ? "--size" : "--fit", frameFormat(out_.fourcc), out_.width,
+                     out_.height);
+}
+
+// Bars and cuts are made on the picture before it is scaled, where the cropper stands.
+void PictureEffects::planFit() {
+    const Fit fit = parseFit(options_.fit);
+    Size size = fit.box;
+    PictureFormat part = in_;
+    const QvRect kept = crop_.value_or(QvRect(0, 0, in_.width, in_.height));
+    part.width = kept.width();
+    part.height = kept.height();
+    part.aspect = out_.aspect;
+    if (fit.how == Fit::How::within) {
+        size = sizeWithin(fit.box, out_);
+    } else if (fit.how == Fit::How::crop) {
+        const QvRect cut = partOfShape(fit.aspect(), part);
+        if (cut.width() < kLeastPart || cut.height() < kLeastPart) throw failure(Msg::fitFar, {options_.fit});
+        if (crop_ || cut.width() != part.width || cut.height() != part.height)
+            crop_ = QvRect(kept.left() + cut.left(), kept.top() + cut.top(), kept.left() + cut.right(),
+                           kept.top() + cut.bottom());
+    } else {
+        const Bars bars = barsAround(kept, part, fit, options_.fit);
+        barColumns_ = bars.columns;
+        barRows_ = bars.rows;
+        if (bars.columns > 0 || bars.rows > 0) crop_ = kept;
+    }
+    if (fit.how != Fit::How::within) out_.aspect = fit.aspect();
+    out_.width = size.width;
+    out_.height = size.height;
 }
 
 // One matrix is that of the side that is YUV, and of the output if both are.
@@ -222,14 +259,19 @@ void PictureEffects::addFixed(FiltersState& state) const {
     }
     if (!crop_) return;
     const auto cropper = makeAnyCodec("cropper", kVideoFilter);
-    const auto set = [&](const char* name, const Any& value) { setChecked(*cropper, name, value, "--crop"); };
+    const char* option = options_.crop.empty() ? "--fit" : "--crop";
+    const auto set = [&](const char* name, const Any& value) { setChecked(*cropper, name, value, option); };
     set("inputWidth", in_.width);
     set("inputHeight", in_.height);
     set("mode", 1);
     set("cropBox", *crop_);
-    if (cropper->getParam("outputWidth") != crop_->width() ||
-        cropper->getParam("outputHeight") != crop_->height())
-        throw failure(Msg::cropRefused, {options_.crop});
+    for (const char* pad : {"padLeft", "padRight"})
+        if (barColumns_ > 0) set(pad, barColumns_);
+    for (const char* pad : {"padTop", "padBottom"})
+        if (barRows_ > 0) set(pad, barRows_);
+    if (cropper->getParam("outputWidth") != crop_->width() + 2 * barColumns_ ||
+        cropper->getParam("outputHeight") != crop_->height() + 2 * barRows_)
+        throw failure(Msg::cropRefused, {option, options_.crop.empty() ? options_.fit : options_.crop});
     state.setFilter("cropper", stateOf(*cropper));
 }
 

@@ -40,6 +40,8 @@ class PictureEffects {
     void planDeinterlace();
     void planRate();
     void planCrop();
+    void planSize();
+    void planFit();
     void planMatrix(bool toPng);
     void planTimecode();
     void addFixed(FiltersState& state) const;
@@ -49,6 +51,7 @@ class PictureEffects {
     PictureFormat in_, out_;
     std::string deinterlace_;  // method, empty for none
     std::optional<QvRect> crop_;
+    int barColumns_ = 0, barRows_ = 0;  // on each side of what is kept
     int inMatrix_ = 0, outMatrix_ = 0;
 };
 

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cstdio>
 
+#include "tarsel/host/events.h"
 #include "tarsel/host/files.h"
 #include "tarsel/source/captionfile.h"
 #include "tarsel/source/picturefile.h"
@@ -50,13 +51,14 @@ std::vector<std::string> engineWarnings() {
     return texts;
 }
 
-void printWarnings() {
+int printWarnings() {
     std::vector<std::string> lines;
     for (const std::string& text : engineWarnings())
         if (const std::string line = lineOf(Msg::engineWarns, {text});
             std::find(lines.begin(), lines.end(), line) == lines.end())
             lines.push_back(line);
-    for (const auto& line : lines) std::fprintf(stderr, "tarsel: warning: %s\n", line.c_str());
+    for (const auto& line : lines) tell(Level::warning, line);
+    return static_cast<int>(lines.size());
 }
 
 std::vector<std::string> moduleNames(int kind) {

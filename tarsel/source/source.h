@@ -58,8 +58,8 @@ void requireFrame(const std::string& option, unsigned fourcc, int width, int hei
 
 // What the engine warned of since the last call, as that a rate is a guess.
 std::vector<std::string> engineWarnings();
-// The same on the standard error, each line once.
-void printWarnings();
+// The same on the standard error, each line once. Returns how many.
+int printWarnings();
 
 // The names of all modules of a kind.
 std::vector<std::string> moduleNames(int kind);

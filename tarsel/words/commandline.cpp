@@ -10,6 +10,8 @@
 
 namespace {
 
+const std::vector<std::string> kShells = {"bash", "zsh", "fish"};
+
 std::vector<std::string> commandNames(const CLI::App& app) {
     std::vector<std::string> names;
     for (const CLI::App* sub : app.get_subcommands({})) names.push_back(sub->get_name());
@@ -160,12 +162,18 @@ void Command::arguments(const char* name, std::vector<std::string>& to, const ch
 
 void Command::take(CLI::Option* option, CommandLine::Kind kind, const std::vector<std::string>& values) {
     if (!group_.empty()) option->group(group_);
-    line_.taken_.push_back({option, kind, values});
+    line_.taken_.push_back({option, kind, values, {}});
 }
 
 void Command::option(const char* names, std::string& to, const char* help, const char* type, Need need) {
     CLI::Option* option = app_.add_option(names, to, help)->type_name(type)->required(need == Need::required);
     take(option, CommandLine::Kind::value);
+}
+
+void Command::option(const char* names, std::string& to, const char* help, const char* type,
+                     const std::vector<std::string>& offers) {
+    option(names, to, help, type);
+    line_.taken_.back().offers = offers;
 }
 
 void Command::list(const char* names, std::vector<std::string>& to, const char* help, const char* type) {
@@ -187,12 +195,15 @@ void Command::flagOrValue(const char* names, std::string& to, const char* help, 
     take(app_.add_flag(names, to, help)->type_name(type), CommandLine::Kind::flagOrValue);
 }
 
-void Command::action(std::function<void()> run) {
-    app_.callback([chosen = &line_.chosen_, run = std::move(run)] { *chosen = run; });
+void Command::action(std::function<void()> run, std::function<void()> prepare) {
+    app_.callback([line = &line_, run = std::move(run), prepare = std::move(prepare)] {
+        line->chosen_ = run;
+        line->prepare_ = prepare;
+    });
 }
 
 CommandLine::CommandLine(const char* description, const std::string& version)
-    : app_(std::make_unique<CLI::App>(description, "tarsel")) {
+    : app_(std::make_unique<CLI::App>(description, "tarsel")), version_(version) {
     app_->require_subcommand(1);
     app_->set_version_flag("--version", version);
 }
@@ -203,27 +214,97 @@ void CommandLine::option(const char* names, std::string& to, const char* help, c
                          const char* variable) {
     CLI::Option* option = app_->add_option(names, to, help)->type_name(type);
     if (variable) option->envname(variable);
-    taken_.push_back({option, Kind::value, {}});
+    taken_.push_back({option, Kind::value, {}, {}});
 }
 
 void CommandLine::flag(const char* names, bool& to, const char* help) {
-    taken_.push_back({app_->add_flag(names, to, help), Kind::flag, {}});
+    taken_.push_back({app_->add_flag(names, to, help), Kind::flag, {}, {}});
 }
 
 Command CommandLine::command(const char* name, const char* help) {
     return Command(*app_->add_subcommand(name, help), *this);
 }
 
+std::vector<OptionText> CommandLine::describedOptions(const CLI::App& app) const {
+    std::vector<OptionText> all;
+    for (const CLI::Option* option : app.get_options()) {
+        if (option->get_positional()) continue;
+        OptionText text;
+        if (!option->get_snames().empty()) text.shortName = "-" + option->get_snames().front();
+        if (!option->get_lnames().empty()) text.longName = "--" + option->get_lnames().front();
+        text.help = option->get_description();
+        if (option->get_group() != "Options") text.heading = option->get_group();
+        for (const Taken& row : taken_)
+            if (row.option == option) {
+                text.kind = row.kind;
+                text.values = row.offers.empty() ? row.values : row.offers;
+                if (row.kind != Kind::flag) text.type = option->get_type_name();
+            }
+        all.push_back(std::move(text));
+    }
+    return all;
+}
+
+ToolText CommandLine::described() const {
+    ToolText tool{app_->get_name(), app_->get_description(), version_, describedOptions(*app_), {}};
+    for (const CLI::App* sub : app_->get_subcommands({})) {
+        CommandText command{sub->get_name(), sub->get_description(), {}, describedOptions(*sub)};
+        for (const CLI::Option* option : sub->get_options())
+            if (option->get_positional())
+                command.arguments.push_back({option->get_name(true),
+                                             option->get_description(),
+                                             {},
+                                             option->get_required(),
+                                             option->get_expected_max() > 1});
+        if (command.name == "help") command.arguments.front().values = commandNames(*app_);
+        if (command.name == "completion") command.arguments.front().values = kShells;
+        tool.commands.push_back(std::move(command));
+    }
+    return tool;
+}
+
+void CommandLine::addTexts() {
+    CLI::App& help = *app_->add_subcommand("help", "Show the help of the tool, or of COMMAND");
+    help.add_option("COMMAND", helpOf_, "One of the commands");
+    help.callback([this] {
+        const auto formatter = app_->get_formatter();
+        const CLI::App* of = app_.get();
+        if (!helpOf_.empty()) {
+            const auto found =
+                app_->get_subcommands([&](const CLI::App* sub) { return sub->get_name() == helpOf_; });
+            if (found.empty())
+                throw failure(Msg::commandUnknown, {helpOf_, suggestion(helpOf_, commandNames(*app_))});
+            of = found.front();
+        }
+        const std::string name =
+            of == app_.get() ? app_->get_name() : app_->get_name() + " " + of->get_name();
+        text_ = formatter->make_help(of, name, CLI::AppFormatMode::Normal);
+    });
+    CLI::App& completion =
+        *app_->add_subcommand("completion", "Print the script with which SHELL completes the command line");
+    completion.add_option("SHELL", shell_, joined(kShells))->required();
+    completion.callback([this] {
+        if (std::find(kShells.begin(), kShells.end(), shell_) == kShells.end())
+            throw failure(Msg::choiceUnknown,
+                          {"SHELL", shell_, suggestion(shell_, kShells), joined(kShells)});
+        text_ = completionFor(shell_, described());
+    });
+    app_->add_subcommand("manual", "Print the man page, for 'man -l'")->callback([this] {
+        text_ = manualOf(described());
+    });
+}
+
 CommandLine::Parsed CommandLine::parse(int argc, char** argv) {
+    addTexts();
     WordCheck(*app_, taken_).run({argv + 1, argv + std::max(argc, 1)});
     try {
         app_->parse(argc, argv);
     } catch (const CLI::Success& shown) {
         std::ostringstream text;
         app_->exit(shown, text, text);
-        return {text.str(), {}};
+        return {text.str(), {}, {}};
     } catch (const CLI::ParseError& error) {
         wrongUse(*app_, error);
     }
-    return {"", chosen_};
+    return {text_, prepare_, chosen_};
 }

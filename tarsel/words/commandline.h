@@ -8,6 +8,8 @@
 #include <string>
 #include <vector>
 
+#include "tarsel/words/commandtext.h"
+
 namespace CLI {
 class App;
 class Option;
@@ -29,27 +31,36 @@ class CommandLine {
     void flag(const char* names, bool& to, const char* help);
     Command command(const char* name, const char* help);
 
-    enum class Kind { value, list, flag, flagOrValue };
+    using Kind = OptionText::Kind;
     // An option as it was described.
     struct Taken {
         const CLI::Option* option;
         Kind kind;
         std::vector<std::string> values;  // the only ones that it takes; empty for any
+        std::vector<std::string> offers;  // what a shell completes for a value; empty for `values`
     };
 
     struct Parsed {
-        std::string text;              // help or version, when these were asked for
-        std::function<void()> action;  // of the command otherwise
+        std::string text;                       // help, version or another text, when one was asked for
+        std::function<void()> prepare, action;  // of the command otherwise; there may be nothing to prepare
     };
     // Throws Failure (usage), with near matches for an unknown name; also for a flag with a value, an option
-    // without one, and an option other than a list or a flag that is given twice.
+    // without one, and an option other than a list or a flag that is given twice. Knows some commands of its
+    // own, which print texts about the others: help, completion and manual.
     Parsed parse(int argc, char** argv);
 
+    // The commands and options that were added so far.
+    ToolText described() const;
+
   private:
+    void addTexts();
+    std::vector<OptionText> describedOptions(const CLI::App& app) const;
+
     std::unique_ptr<CLI::App> app_;
     friend class Command;
     std::vector<Taken> taken_;
-    std::function<void()> chosen_;
+    std::function<void()> prepare_, chosen_;
+    std::string version_, text_, helpOf_, shell_;
 };
 
 // One command as it is described. What is given goes into the targets, which live until the command has run.
@@ -65,6 +76,9 @@ class Command {
 
     void option(const char* names, std::string& to, const char* help, const char* type,
                 Need need = Need::optional);
+    // The same, with some of the values that shells offer.
+    void option(const char* names, std::string& to, const char* help, const char* type,
+                const std::vector<std::string>& offers);
     // One value each time that it is given.
     void list(const char* names, std::vector<std::string>& to, const char* help, const char* type);
     void choice(const char* names, std::string& to, const char* help, const std::vector<std::string>& values);
@@ -74,8 +88,9 @@ class Command {
     // The heading in the help of the options that follow; "" ends it.
     void group(const char* heading) { group_ = heading; }
 
-    // What runs when this command was given, once the whole line has been read.
-    void action(std::function<void()> run);
+    // What runs when this command was given, once the whole line has been read; `prepare` before the engine
+    // starts.
+    void action(std::function<void()> run, std::function<void()> prepare = {});
 
   private:
     void take(CLI::Option* option, CommandLine::Kind kind, const std::vector<std::string>& values = {});

@@ -1,5 +1,6 @@
 #include "tarsel/words/timespec.h"
 
+#include <algorithm>
 #include <charconv>
 #include <cmath>
 #include <cstdio>
@@ -132,6 +133,27 @@ std::optional<QvRatio> ratioOf(std::string_view text) {
 
 }  // namespace
 
+MediaTime parseInstant(std::string_view text, const std::optional<QvFramerate>& rate, std::string_view option,
+                       const MediaTime& length) {
+    if (text.empty() || text[0] != '-') return parseTime(text, rate, option);
+    const std::string_view before = text.substr(1);
+    // By frames, as a length need not be a whole number of them in ticks.
+    const bool frames = rate && before.ends_with('f');
+    const MediaTime back = parseTime(before, rate, option);
+    const MediaTime at =
+        frames ? MediaTime(length.position(*rate) - back.position(*rate), *rate, kTicks) : length - back;
+    if (at < MediaTime(0LL, kTicks))
+        throw failure(Msg::timeBeforeStart, {option, text, formatTime(length.seconds())});
+    return at;
+}
+
+MediaTime parseSpan(std::string_view text, const std::optional<QvFramerate>& rate, std::string_view option,
+                    const MediaTime& from) {
+    const MediaTime span = parseTime(text, rate, option);
+    if (!rate || !text.ends_with('f')) return from + span;
+    return MediaTime(from.position(*rate) + span.position(*rate), *rate, kTicks);
+}
+
 QvFramerate parseRate(std::string_view text, std::string_view option) {
     std::string_view digits = text;
     int interlaced = 0;
@@ -181,6 +203,19 @@ Size parseSize(std::string_view text, std::string_view option, int most, Msg wro
             return {static_cast<int>(*width), static_cast<int>(*height)};
     }
     throw failure(wrong, {option, text});
+}
+
+Size parseSizeOrShape(std::string_view text, std::string_view option) {
+    const size_t x = text.find_first_of("xX");
+    const auto parts = {text.substr(0, x), x == std::string_view::npos ? "" : text.substr(x + 1)};
+    if (std::count(parts.begin(), parts.end(), "-1") != 1)
+        return parseSize(text, option, 65535, Msg::sizeOrShapeWrong);
+    std::string whole(text);
+    const bool first = *parts.begin() == "-1";
+    whole.replace(first ? 0 : x + 1, 2, "1");
+    Size size = parseSize(whole, option, 65535, Msg::sizeOrShapeWrong);
+    (first ? size.width : size.height) = -1;
+    return size;
 }
 
 long long parseNumber(std::string_view text, long long low, long long high, std::string_view option) {

@@ -13,6 +13,14 @@
 // timecode need `rate`. Throws Failure (usage) with `option` in the line.
 MediaTime parseTime(std::string_view text, const std::optional<QvFramerate>& rate, std::string_view option);
 
+// A time in what lasts `length`; "-10" and "-250f" are so long before its end. Throws Failure (usage) for
+// what is before its start as well.
+MediaTime parseInstant(std::string_view text, const std::optional<QvFramerate>& rate, std::string_view option,
+                       const MediaTime& length);
+// So much after `from`; frames are counted from the one that `from` is in.
+MediaTime parseSpan(std::string_view text, const std::optional<QvFramerate>& rate, std::string_view option,
+                    const MediaTime& from);
+
 // Frames a second: "25", "29.97" and the other NTSC decimals (30000/1001), "30000/1001", "25i" (top field
 // first), "25b" (bottom field first), and the names "pal", "ntsc", "film", "ntsc-film". A rate of fields, as
 // "50i" for 25 frames, is refused with the one of frames.
@@ -28,6 +36,9 @@ struct Size {
 };
 // "1280x720": both from 1 to `most`. Throws Failure with the message `wrong`.
 Size parseSize(std::string_view text, std::string_view option, int most = 65535, Msg wrong = Msg::sizeWrong);
+
+// The same, or -1 for one of both, which is then -1 here: "1280x-1".
+Size parseSizeOrShape(std::string_view text, std::string_view option);
 
 // A whole number within bounds.
 long long parseNumber(std::string_view text, long long low, long long high, std::string_view option);

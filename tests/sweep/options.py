@@ -5,6 +5,7 @@ from runner import Box
 
 NUMBERS = ["", " ", "x", "-1", "nan", "inf", "1e9", "99999999999999999999", "0x10", "1 2", "%s%n", "-0", "4294967297",
            "1" * 5000, "\u0663", "5\n6"]
+INSTANTS = [n for n in NUMBERS if n not in ("-1", "-0")]  # these count from the end
 CARD = jobs.card("-o", "card.yuv")
 SOUND = ["transcode", "in.wav", "-o", "out.wav", "-y"]
 CLIP = ["transcode", *jobs.CLIP, "-o", "part.yuv", "-y"]
@@ -12,11 +13,13 @@ FRAME = ["frame", *jobs.CLIP, "-o", "shot.png", "-y"]
 
 # The arguments before the option, the option, and its values. Each ends with status 2.
 REFUSED = [
-    (CARD, "--from", [*NUMBERS, "1:2:3:4:5", "00:00:61", "12f f"]),
-    (CARD, "--to", NUMBERS),
+    (CARD, "--from", [*INSTANTS, "1:2:3:4:5", "00:00:61", "12f f"]),
+    (CARD, "--to", INSTANTS),
     (SOUND, "--samplerate", [*NUMBERS, "0"]), (SOUND, "--channels", [*NUMBERS, "0", "9"]),
     (SOUND, "--bits", [*NUMBERS, "0", "7", "64"]),
-    (CARD, "--size", [*NUMBERS, "0x0", "1x", "x1", "-1x5", "65536x1", "99999999999x1"]),
+    (CARD, "--size", [*NUMBERS, "0x0", "1x", "x1", "-2x5", "-1x-1", "65536x1", "99999999999x1"]),
+    (CARD, "--fit", [*NUMBERS, "0x0", "-1x5", "1x1,", "1x1,x", "1x1,bars,crop", "1x60000,bars"]),
+    (CARD, "--duration", [*NUMBERS, "0", "1:2:3:4:5"]), (CARD, "--threads", [*NUMBERS, "0", "257"]),
     (CARD, "--rate", [*NUMBERS, "0", "1/0", "0/0", "1/-1", "1e400", "25ii"]),
     (CARD, "--pixel", [*NUMBERS, "I42", "I4200"]),
     (CARD, "--matrix", [*NUMBERS, "601:", ":709", "601:709:601"]),
@@ -24,8 +27,8 @@ REFUSED = [
     (CARD, "--fade", [v for v in NUMBERS if v] + ["1,2,3"]),
     (CARD, "--deinterlace", [v for v in NUMBERS if v]),
     (CARD, "--timecode", ["start=x", "mode=x", "x=", "size=99999999999"]),
-    (CLIP, "--subtitle-style", NUMBERS), (CARD, "--progress", ["", "x", "JSON "]),
-    (FRAME, "--at", NUMBERS), (FRAME, "--sheet", [*NUMBERS, "0x0", "33x33", "1x-1", "65535x65535"]),
+    (CLIP, "--subtitle-style", NUMBERS), (CARD, "--progress", ["", "x", "JSON ", "json:", "json:99999", "log:0", "log:x", "none:1"]),
+    (FRAME, "--at", [*INSTANTS, "--1"]), (FRAME, "--sheet", [*NUMBERS, "0x0", "33x33", "1x-1", "65535x65535"]),
     (["transcode", "clip.yuv", "-o", "part.yuv", "-y"], "--raw",
      [*NUMBERS, "size=0x0", "pixel=I420", "size=64x48,pixel=UYVY4", "size=64x48,pixel=BGR3",
       "size=64x48,pixel=none,rate=25", "size=64x48,pixel=I420,rate=0", "size=64x48,rate=50i",

@@ -157,6 +157,24 @@ TEST_F(Installed, ByPackageAndByPkgConfig) {
     EXPECT_EQ(runProgram({folder.file("by_pkg_config")}, here()).out, byPackage.out);
 }
 
+TEST_F(Installed, ManualCompletionsAndChanges) {
+    const std::string program = folder.file("tree/bin/tarsel"), share = folder.file("tree/share/");
+    const struct {
+        const char* file;
+        Words made;
+    } texts[] = {{"man/man1/tarsel.1", {"manual"}},
+                 {"bash-completion/completions/tarsel", {"completion", "bash"}},
+                 {"zsh/site-functions/_tarsel", {"completion", "zsh"}},
+                 {"fish/vendor_completions.d/tarsel.fish", {"completion", "fish"}}};
+    for (const auto& text : texts) {
+        EXPECT_TRUE(TempFolder::read(share + text.file) == runProgram(Words{program} + text.made, here()).out)
+            << text.file;
+        EXPECT_GT(TempFolder::read(share + text.file).size(), 3000u) << text.file;
+    }
+    for (const char* file : {"CHANGELOG.md", "progress.schema.json"})
+        EXPECT_TRUE(fs::exists(share + "doc/qvplugcore/" + file)) << file;
+}
+
 TEST_F(Installed, APluginBuiltAgainstIt) {
     EXPECT_EQ(configure(std::string(kSources) + "/examples/plugin", "plugin", "-DCMAKE_BUILD_TYPE=Debug"),
               "");

@@ -67,8 +67,7 @@ TEST_F(Signal, StopsAndLeavesWhatWasThere) {
         EXPECT_EQ(o.status, c.status) << o.err;
         EXPECT_THAT(o.err, testing::HasSubstr("\"event\":\"end\""));
         EXPECT_THAT(o.err, testing::HasSubstr("\"state\":\"stopped\""));
-        EXPECT_THAT(o.err,
-                    testing::HasSubstr("tarsel: stopped: a signal ended the job; no output was written\n"));
+        EXPECT_THAT(o.err, testing::HasSubstr("\"stopped: a signal ended the job; no output was written\""));
         EXPECT_EQ(listing(), c.before);
     }
     EXPECT_EQ(contents("out.raw"), "precious");
@@ -110,7 +109,7 @@ TEST_F(Signal, TheSecondEndsTheCommandOfPost) {
     run.signal(SIGINT);
     const Outcome o = run.finish();
     EXPECT_EQ(o.status, 130);
-    EXPECT_THAT(o.err, testing::HasSubstr("ended the command of --post; 'out.raw' is complete\n"));
+    EXPECT_THAT(o.err, testing::HasSubstr("stopped in the command of --post: it got the signal and has ended; 'out.raw' is complete\n"));
 }
 
 // A pipe that nobody has opened, or that nobody reads, holds nothing up, whatever it is for.
@@ -170,6 +169,7 @@ TEST_F(Signal, OnRequestALineOfTheState) {
     const int reader = openPipe();
     Process held(words({"transcode", kLarge, "-o", "pipe.raw", "--progress", "json"}), here());
     ASSERT_TRUE(hasData(reader));
+    ASSERT_TRUE(held.waitFor("\"event\":\"progress\"")) << "of its start";
     held.signal(SIGUSR1);  // its worker waits for the reader
     EXPECT_TRUE(held.waitFor("\"event\":\"progress\""));
     // Until its handler is there the program does what any does with this signal: wait for the folder of the
@@ -198,7 +198,7 @@ TEST_F(Signal, OnRequestTheStateOfPost) {
         Process run(words(job + (json ? Words{"--progress", "json"} : Words{})), here());
         ASSERT_TRUE(run.waitFor("started"));
         run.signal(SIGUSR1);
-        EXPECT_TRUE(run.waitFor(json ? "\"state\":\"post\"}" : "tarsel: the command of --post is running\n"));
+        EXPECT_TRUE(run.waitFor(json ? "\"the command of --post is running\"}" : "tarsel: the command of --post is running\n"));
         run.signal(SIGTERM);
         EXPECT_EQ(run.finish().status, 143);
     }
@@ -280,7 +280,7 @@ TEST_F(Signal, AnInputThatShrinksIsDamage) {
             Process run(words(row.job + Words{"--progress", "json"} +
                               (partial ? Words{"--accept-partial"} : Words{})),
                         here());
-            ASSERT_TRUE(run.waitFor("\"event\":\"start\"")) << run.finish().err;
+            ASSERT_TRUE(run.waitFor("\"event\":\"progress\"")) << run.finish().err;
             run.signal(SIGSTOP);
             std::filesystem::resize_file(folder.file(row.input), row.after);
             run.signal(SIGCONT);

@@ -88,8 +88,8 @@ TEST_F(Streams, ARedirectedFileIsWrittenWhereItStands) {
 }
 
 TEST_F(Streams, TheStandardOutputIsForDataOnly) {
-    const Outcome o = works({"transcode", kCard, "-o", "-", "--format", "raw", "--progress", "json", "--post",
-                             "echo said by the command"});
+    const Outcome o = works({"transcode", kCard, "-o", "-", "--format", "raw", "--progress", "log:1",
+                             "--post", "echo said by the command"});
     EXPECT_EQ(o.out.size(), kFrames);
     EXPECT_THAT(o.err, testing::HasSubstr("said by the command"));
     EXPECT_EQ(works({"transcode", kCard, "-o", "/dev/stderr", "--format", "raw", "-q"}).err.size(), kFrames);
@@ -165,8 +165,8 @@ TEST_F(Streams, AStopEndsAWaitForTheReader) {
     mkfifo(folder.file("pipe").c_str(), 0600);
     {
         Process run(words({"transcode", endless, "-o", "pipe", "--progress", "json"}), here());
-        ASSERT_TRUE(run.waitFor("\"event\":\"start\""));
-        stops(run, SIGTERM, 143, "tarsel: stopped: a signal ended the job; no output was written");
+        ASSERT_TRUE(run.waitFor("\"event\":\"progress\""));
+        stops(run, SIGTERM, 143, "\"stopped: a signal ended the job; no output was written\"");
     }
     // Nobody reads it.
     const int reader = open(folder.file("pipe").c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);

@@ -9,6 +9,7 @@
 
 #include <unistd.h>
 
+#include "tarsel/host/events.h"
 #include "tarsel/host/outputs/attributes.h"
 #include "tarsel/host/outputs/foldercalls.h"
 #include "tarsel/host/outputs/recovery.h"
@@ -77,6 +78,12 @@ fs::path followed(fs::path name) {
     return name;
 }
 
+// That `name` is not written, as it exists.
+Failure existing(const fs::path& name, const OutputPolicy& policy) {
+    const Failure told = failure(policy.keep ? Msg::outputKept : Msg::outputExists, {name.string()});
+    return policy.keep && policy.quiet ? Failure(Exit::done, "") : told;
+}
+
 // What follows the stem of a name, "#7.png" as "##.png": numbers make no other set.
 std::string shapeOf(std::string_view name) {
     std::string shape;
@@ -125,8 +132,7 @@ void Outputs::putInOrder(const fs::path& folder) const {
     if (!policy_.recover) return;
     const auto found = recoverPlace(folder.string(), {.stale = policy_.stale, .sync = policy_.sync});
     if (policy_.quiet) return;
-    for (const auto& line : recoveryLines(folder.string(), found, true))
-        std::fprintf(stderr, "tarsel: %s\n", line.c_str());
+    for (const auto& line : recoveryLines(folder.string(), found, true)) tell(Level::note, line);
 }
 
 bool Outputs::isInput(const fs::path& name) const {
@@ -145,7 +151,7 @@ void Outputs::checkFinal(const fs::path& name) const {
     std::error_code error;
     const auto status = fs::symlink_status(name, error);
     if (error && status.type() == fs::file_type::none) refuse(name, error.value());
-    if (!policy_.overwrite && fs::exists(status)) throw failure(Msg::outputExists, {name.string()});
+    if (!policy_.overwrite && fs::exists(status)) throw existing(name, policy_);
     if (fs::is_directory(name, error)) refuse(Msg::outputFolderInTheWay, name);
 }
 
@@ -370,7 +376,7 @@ void Outputs::notPlaced(const PlaceResult& result, const std::string& folder) co
     const std::string name =
         (result.name.empty() ? output_ : inFolder(folder, std::string(result.name))).string();
     const std::string reason = std::strerror(result.error);
-    if (!result.torn && result.error == EEXIST) throw failure(Msg::outputExists, {name});
+    if (!result.torn && result.error == EEXIST) throw existing(name, policy_);
     if (!result.torn) throw failure(Msg::outputNotPlaced, {name, reason});
     throw failure(Msg::outputTorn, {name, reason, folder});
 }

@@ -20,6 +20,7 @@ struct OutputPolicy {
 
     OutputPolicy(bool overwriting) : overwrite(overwriting) {}
     bool overwrite;
+    bool keep = false;         // what exists is left, and the run ends with Exit::done
     bool sync = true;          // bring results to the disk before what they replace is removed
     bool recover = true;       // put in order what ended runs have left in the folder
     bool quiet = false;        // say nothing of that

@@ -1,0 +1,105 @@
+// The man page.
+#include "tarsel/words/commandtext.h"
+
+namespace {
+
+// Signs that roff takes for its own: a backslash, a hyphen that is a minus, a dot or a quote that begins a
+// line.
+std::string roff(const std::string& text) {
+    std::string out;
+    for (const char c : text) {
+        if (out.empty() && (c == '.' || c == '\'')) out += "\\&";
+        if (c == '\\')
+            out += "\\e";
+        else if (c == '-')
+            out += "\\-";
+        else if (c == '\'')
+            out += "\\(aq";
+        else
+            out += c;
+    }
+    return out;
+}
+
+std::string bold(const std::string& text) { return "\\fB" + roff(text) + "\\fR"; }
+std::string slanted(const std::string& text) { return "\\fI" + roff(text) + "\\fR"; }
+
+std::string entry(const OptionText& option) {
+    std::string head;
+    for (const auto& name : {option.shortName, option.longName}) {
+        if (name.empty()) continue;
+        if (!head.empty()) head += ", ";
+        head += bold(name);
+    }
+    if (option.takesValue()) head += " " + slanted(option.type);
+    if (option.kind == OptionText::Kind::flagOrValue) head += slanted(option.type);
+    std::string text = ".TP\n" + head + "\n" + roff(option.help);
+    if (option.kind == OptionText::Kind::list) text += ". May be given more than once";
+    return text + (text.ends_with("...") ? "\n" : ".\n");
+}
+
+std::string entries(const std::vector<OptionText>& options) {
+    std::string text, heading;
+    for (const auto& option : options) {
+        if (option.heading != heading && !option.heading.empty())
+            text += ".PP\n" + roff(option.heading) + ":\n";
+        heading = option.heading;
+        text += entry(option);
+    }
+    return text;
+}
+
+std::string synopsis(const CommandText& command) {
+    std::string line = bold("tarsel " + command.name);
+    for (const auto& argument : command.arguments) {
+        const std::string word = slanted(argument.name) + (argument.many ? "..." : "");
+        line += argument.required ? " " + word : " [" + word + "]";
+    }
+    for (const auto& option : command.options)
+        if (option.longName == "--output" && option.takesValue())
+            line += " " + bold(option.shortName) + " " + slanted(option.type);
+    return line + " [" + slanted("options") + "]\n";
+}
+
+constexpr struct {
+    const char *status, *meaning;
+} kStatus[] = {
+    {"0", "done and checked"},
+    {"1", "failed, or with --strict a warning"},
+    {"2", "wrong use"},
+    {"3", "an input can't be opened or is damaged"},
+    {"4", "an output can't be written"},
+    {"5", "a module is missing or can't be used"},
+    {"6", "the result failed its check"},
+    {"129, 130, 143", "stopped by SIGHUP, SIGINT, SIGTERM; a second signal ends the tool at once"},
+};
+
+}  // namespace
+
+std::string manualOf(const ToolText& tool) {
+    std::string text = ".TH TARSEL 1 \"\" " + std::string("\"") + roff(tool.version) +
+                       "\" \"User Commands\"\n.SH NAME\ntarsel \\- transcodes, inspects and draws media\n"
+                       ".SH SYNOPSIS\n.nf\n";
+    for (const auto& command : tool.commands) text += synopsis(command);
+    text += ".fi\n.SH DESCRIPTION\n" + roff(tool.description) +
+            "\nThe standard output carries data only; messages and progress go to the standard error.\n"
+            ".SH OPTIONS\nBefore the command:\n" +
+            entries(tool.options);
+    for (const auto& command : tool.commands) {
+        text += ".SH TARSEL " + roff(command.name) + "\n" + roff(command.help) + ".\n";
+        for (const auto& argument : command.arguments)
+            text += ".TP\n" + slanted(argument.name) + "\n" + roff(argument.help) + ".\n";
+        text += entries(command.options);
+    }
+    text += ".SH EXIT STATUS\n";
+    for (const auto& row : kStatus) text += ".TP\n" + bold(row.status) + "\n" + roff(row.meaning) + "\n";
+    text += ".SH ENVIRONMENT\n.TP\n" + bold("TARSEL_PLUGINS") + "\nThe folder of plug\\-ins, unless " +
+            bold("--plugins") + " names one.\n.TP\n" + bold("NO_COLOR") +
+            "\nNo colours on the terminal if it is set to anything.\n";
+    text += ".SH EXAMPLES\n.nf\n";
+    for (const char* line : {"tarsel transcode testgen:size=640x360,duration=4 -o card.avi",
+                             "tarsel transcode card.avi --size 1280x-1 --from=-2 -o end.avi",
+                             "tarsel frame card.avi --at 1.5 -o card.png", "tarsel info card.avi --json"})
+        text += roff(line) + "\n";
+    return text + ".fi\n";
+}
