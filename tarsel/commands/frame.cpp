@@ -7,6 +7,7 @@
 
 #include "tarsel/commands/commands.h"
 #include "tarsel/commands/outputoptions.h"
+#include "tarsel/host/events.h"
 #include "tarsel/host/outputs/outputs.h"
 #include "tarsel/host/outputs/streamoutput.h"
 #include "tarsel/host/plugins.h"
@@ -36,6 +37,7 @@ struct Given {
     std::shared_ptr<Outputs> outputs;  // null where there is a `stream`
     std::shared_ptr<StreamOutput> stream;
     Signals* signals = nullptr;
+    int warnings = 0;  // of the input
 };
 
 // Scales and converts pictures of one source to BGR3 of one size.
@@ -73,7 +75,7 @@ void save(const QvFrame& picture, const Given& given) {
         if (errno != 0) throw systemFailure(Msg::outputSystem, given.output, errno);
         throw failure(Msg::outputRefused, {given.output, "the picture can't be converted to a PNG"});
     }
-    const int warnings = printWarnings() + pluginWarnings();
+    const int warnings = given.warnings + printWarnings() + pluginWarnings();
     if (given.strict && warnings > 0)
         throw failure(Msg::warningsCount, {given.output, std::to_string(warnings)});
     if (outputs) outputs->commit();
@@ -132,7 +134,7 @@ void frame(Given& given) {
     if (!given.stream) given.outputs = std::make_shared<Outputs>(given.output, "-o", source.files(), policy);
     if (source.decoder().nrStreams(1) == 0) throw failure(Msg::fileNoPicture, {given.input});
     source.selectAll();
-    checkDamage(source, given.effects.acceptPartial);
+    given.warnings = checkDamage(source, given.effects.acceptPartial);
     PictureReader reader(source, given.effects);
     if (reader.pipe() && given.outputs) given.outputs->addInputs(filterFiles(*reader.pipe()).read);
     if (!given.sheet.empty()) return saveSheet(reader, given);
