@@ -1,0 +1,74 @@
+// The end of an output: the sink, the multiplexer that writes into it, and what either has from the other or
+// from those that stood here before.
+#pragma once
+
+#include <memory>
+
+#include "builtin/pipes/output/members/muxertraits.h"
+#include "builtin/pipes/output/members/programlist.h"
+#include "builtin/pipes/output/members/savedsettings.h"
+#include "core/encode/qvmuxer.h"
+#include "core/encode/qvsink.h"
+
+class PipeReport;
+class QvPreset;
+
+class MuxerPlace {
+  public:
+    explicit MuxerPlace(PipeReport& report) : report_(report) {}
+    ~MuxerPlace() { drop(); }
+    MuxerPlace(const MuxerPlace&) = delete;
+    MuxerPlace& operator=(const MuxerPlace&) = delete;
+
+    QvMuxer* muxer() const { return muxer_.get(); }  // null before the first preset
+    QvSink* sink() const { return sink_.get(); }
+    const Any& sinkName() const { return sinkName_; }
+    // Of the multiplexer that stands here; the defaults without one.
+    const MuxerTraits& traits() const { return muxerTraits(muxer_ ? muxer_->name() : nullptr); }
+    ProgramList programs() const { return ProgramList(muxer_.get()); }
+    bool hasPrograms() const;
+    // How many streams of the type can still be added; a missing multiplexer is an assertion.
+    int room(int type, int ofThis, int inAll) const;
+
+    // A new multiplexer or sink of a module; null when there is none of that kind.
+    static std::unique_ptr<QvMuxer> newMuxer(const char* module);
+    // Exchanges the sink. The multiplexer writes into the new one. A failure leaves all as it was.
+    int setSink(const char* module);
+    // Detaches and deletes the multiplexer; its settings are not kept.
+    void drop();
+    // Takes the multiplexer, which is not attached yet.
+    void put(std::unique_ptr<QvMuxer> muxer) { muxer_ = std::move(muxer); }
+    // Lets the multiplexer write into the sink.
+    void attach();
+
+    // What the multiplexer hands on to the one that replaces it. Its whole settings are kept for its return.
+    struct Handover {
+        Any type;
+        Any pal;
+        Any dropFrame;
+    };
+    Handover handOver();
+    // The settings that a multiplexer of this name had here, else those of a user's preset, which must be of
+    // the same module (assertion).
+    void restoreSettings(const QvPreset& preset);
+
+    // Sink and multiplexer get the name, now and, if it is valid, again with repeatFilename().
+    int setFilename(const Any& name);
+    void repeatFilename();
+    // The sink's answer, else the name that was set.
+    Any filename() const;
+
+    // As qvOfferParam does; 0 without a multiplexer.
+    int offer(const char* name, const Any& value) const;
+
+  private:
+    int offerFilename();
+
+    PipeReport& report_;
+    // In this order: the multiplexer goes before the sink whose stream it holds.
+    std::unique_ptr<QvSink> sink_;
+    std::unique_ptr<QvMuxer> muxer_;
+    Any sinkName_ = "filesink";
+    Any filename_;
+    SavedSettings saved_;
+};

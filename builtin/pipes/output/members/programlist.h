@@ -1,0 +1,34 @@
+// The programs of a multiplexer, which has them only when it answers the interface for them.
+#pragma once
+
+#include <vector>
+
+#include "core/encode/qvmuxer.h"
+
+class PipeReport;
+
+class ProgramList {
+  public:
+    // `muxer` is borrowed and may be null.
+    explicit ProgramList(const QvMuxer* muxer);
+
+    // Failed, or 0 programs, without the interface.
+    int count() const;
+    int add(const QvProgram& program);
+    int remove(int index);  // an index outside the list is an assertion
+    int get(int index, QvProgram& program) const;
+    int set(int index, const QvProgram& program);
+    int streams(int index, AnyVector& pairs) const;
+
+    std::vector<QvProgram> all() const;
+    // Nothing without the interface. A program that is refused ends it and is a failure of the pipe.
+    int addAll(const std::vector<QvProgram>& programs, PipeReport& report);
+
+    // The stored form: dictionaries of "program_PID", "program_number" and "PCR_PID"; other elements are
+    // passed over.
+    static AnyVector toState(const std::vector<QvProgram>& programs);
+    static std::vector<QvProgram> fromState(const AnyVector& state);
+
+  private:
+    QvIProgramSetup* setup_;
+};
