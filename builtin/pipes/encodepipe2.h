@@ -4,7 +4,7 @@
 #include "builtin/pipes/output/members/activepreset.h"
 #include "builtin/pipes/output/members/muxerplace.h"
 #include "builtin/pipes/output/members/outputstreams.h"
-#include "builtin/pipes/output/members/pipereport.h"
+#include "builtin/pipes/output/members/pipehost.h"
 #include "builtin/pipes/output/muxerexchange.h"
 #include "builtin/pipes/output/outputrun.h"
 #include "builtin/pipes/output/pipestate.h"
@@ -28,7 +28,7 @@
 //     preset_     what is allowed              builder_    adds and removes streams
 //     exchange_   another multiplexer          state_      store and restore
 //     applier_    another preset               run_        open and close
-class EncodePipe2 : public QvEncodePipe, public QvIProgramSetup, private PipeReport {
+class EncodePipe2 : public QvEncodePipe, public QvIProgramSetup, private PipeHost {
   public:
     EncodePipe2();
     ~EncodePipe2() override;
@@ -44,6 +44,7 @@ class EncodePipe2 : public QvEncodePipe, public QvIProgramSetup, private PipeRep
     void store(AnyDict& state) const override;
     int restore(const AnyDict& state) override;
 
+    int setFilename(const Any& name) override { return QvEncodePipe::setFilename(name); }
     int writeFrame(QvFrame* frame, int stream) override;
     int writePcm(QvPcm* pcm, int stream) override;
 

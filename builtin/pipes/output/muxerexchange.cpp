@@ -1,6 +1,6 @@
 #include "builtin/pipes/output/muxerexchange.h"
 
-#include "builtin/pipes/output/members/pipereport.h"
+#include "builtin/pipes/output/members/pipehost.h"
 #include "core/arch/qvassert.h"
 #include "core/engine/log/qvlog.h"
 #include "core/engine/modules/qvregistry.h"
@@ -15,18 +15,21 @@ int MuxerExchange::put(const char* module, bool keepStreams) {
     QV_ASSERT_MSG(keepStreams || streams_.empty(),
                   "EncodePipe._setMuxer: streams not removed while changingPreset");
     if (!qv_registry()->module(module))
-        return report_.fail(QvStatus::failed, "setMuxer: muxer '%s' not available", module);
+        return host_.fail(QvStatus::failed, "setMuxer: muxer '%s' not available", module);
     if (!preset_.preset().muxerAllowed(module))
-        return report_.fail(QvStatus::failed, "setMuxer: '%s' not allowed in current preset", module);
+        return host_.fail(QvStatus::failed, "setMuxer: '%s' not allowed in current preset", module);
     auto fresh = MuxerPlace::newMuxer(module);
-    if (!fresh) report_.failHard(QvStatus::failed, "setMuxer: muxer '%s' not loaded", module);
+    if (!fresh) {
+        host_.fail(QvStatus::failed, "setMuxer: muxer '%s' not loaded", module);
+        QV_FAIL(host_.lastFailure());
+    }
     return replace(std::move(fresh), keepStreams);
 }
 
 int MuxerExchange::putInternal(const char* module, const char* sink) {
     QV_ASSERT_MSG(streams_.empty(), "Only allowed for multipass, there must be no streams");
     auto fresh = MuxerPlace::newMuxer(module);
-    if (!fresh) return report_.fail(QvStatus::failed, "setMuxer: unknown muxer '%s'", module);
+    if (!fresh) return host_.fail(QvStatus::failed, "setMuxer: unknown muxer '%s'", module);
     end_.drop();
     if (const int result = end_.setSink(sink)) return result;
     end_.put(std::move(fresh));
@@ -72,7 +75,7 @@ int MuxerExchange::replace(std::unique_ptr<QvMuxer> fresh, bool keepStreams) {
 // A stream keeps its encoder with its settings where the new multiplexer takes it.
 void MuxerExchange::rebuild(const std::vector<StreamSnapshot>& former,
                             const std::vector<QvProgram>& programs) {
-    if (end_.hasPrograms() && !programs.empty()) end_.programs().addAll(programs, report_);
+    if (end_.hasPrograms() && !programs.empty()) end_.programs().addAll(programs, host_);
     for (const auto& shot : former) {
         StreamRequest request;
         request.params = shot.params;
@@ -90,7 +93,7 @@ void MuxerExchange::rebuild(const std::vector<StreamSnapshot>& former,
         }
         const int nr = builder_.add(shot.type, std::move(request));
         if (nr < 0) {
-            qv_dbg()->warning("EncodePipe._setMuxer: skipped stream - %s", report_.lastFailure());
+            qv_dbg()->warning("EncodePipe._setMuxer: skipped stream - %s", host_.lastFailure());
             continue;
         }
         auto* added = streams_.find(shot.type, nr);

@@ -11,8 +11,8 @@ class MuxerExchange {
   public:
     // All are borrowed for the life of the object.
     MuxerExchange(OutputStreams& streams, MuxerPlace& end, ActivePreset& preset, StreamBuilder& builder,
-                  PipeReport& report)
-        : streams_(streams), end_(end), preset_(preset), builder_(builder), report_(report) {}
+                  PipeHost& host)
+        : streams_(streams), end_(end), preset_(preset), builder_(builder), host_(host) {}
 
     // The streams stay, and the new multiplexer gets what the old one hands on.
     int change(const char* module);
@@ -29,5 +29,5 @@ class MuxerExchange {
     MuxerPlace& end_;
     ActivePreset& preset_;
     StreamBuilder& builder_;
-    PipeReport& report_;
+    PipeHost& host_;
 };

@@ -3,7 +3,7 @@
 #include <algorithm>
 #include <cstring>
 
-#include "builtin/pipes/output/members/pipereport.h"
+#include "builtin/pipes/output/members/pipehost.h"
 #include "core/engine/log/qvlog.h"
 #include "core/stream/qvbufstrm.h"
 

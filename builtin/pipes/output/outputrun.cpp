@@ -2,7 +2,7 @@
 
 #include <new>
 
-#include "builtin/pipes/output/members/pipereport.h"
+#include "builtin/pipes/output/members/pipehost.h"
 #include "core/arch/qvexception.h"
 #include "core/arch/undo_p.h"
 #include "core/engine/files/qvfileutil.h"
@@ -65,7 +65,7 @@ int OutputRun::failOpen(const QvCodec& member, int result) {
         const Undo finishing([this] { finish(false); });
         text = member.errorDesc();
     }
-    report_.fail(code, "%s", text.c_str());
+    host_.fail(code, "%s", text.c_str());
     return result;
 }
 
@@ -98,7 +98,7 @@ int OutputRun::finishEncoders(bool aborting) {
         const auto tell = [&](int result, const std::string& reason) {
             qv_dbg()->error("EncodePipe.%s: error (%d) at stream %s #%d (%s)", aborting ? "abort" : "close",
                             result, qvStreamTypeName(stream->type), at, encoder->name());
-            report_.fail(result, "%s", reason.c_str());
+            host_.fail(result, "%s", reason.c_str());
         };
         all |= finishing(
             *encoder, [&] { return aborting ? encoder->abort() : encoder->close(); }, tell);
@@ -109,9 +109,8 @@ int OutputRun::finishEncoders(bool aborting) {
 int OutputRun::finishMuxer(bool aborting) {
     auto& muxer = *end_.muxer();
     const auto tell = [&](int, const std::string& reason) {
-        report_.fail(QvStatus::failed,
-                     aborting ? "Aborting muxer '%s' failed." : "Closing muxer '%s' failed.",
-                     muxer.displayName());
+        host_.fail(QvStatus::failed, aborting ? "Aborting muxer '%s' failed." : "Closing muxer '%s' failed.",
+                   muxer.displayName());
         logForUser(reason);
     };
     return finishing(
@@ -121,7 +120,7 @@ int OutputRun::finishMuxer(bool aborting) {
 int OutputRun::finishSink(bool aborting) {
     auto& sink = *end_.sink();
     const auto tell = [&](int, const std::string& reason) {
-        report_.fail(QvStatus::failed, "%s", aborting ? "Aborting sink failed." : "Closing sink failed.");
+        host_.fail(QvStatus::failed, "%s", aborting ? "Aborting sink failed." : "Closing sink failed.");
         logForUser(reason);
     };
     return finishing(
@@ -130,6 +129,6 @@ int OutputRun::finishSink(bool aborting) {
 
 // The pipe's text says which member failed; the reason is a message of its own.
 void OutputRun::logForUser(const std::string& reason) const {
-    qv_log()->error("%s", report_.lastFailure());
+    qv_log()->error("%s", host_.lastFailure());
     if (!reason.empty()) qv_log()->error("%s", reason.c_str());
 }

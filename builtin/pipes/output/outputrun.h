@@ -10,13 +10,13 @@
 #include "builtin/pipes/output/members/outputstreams.h"
 #include "builtin/pipes/output/outputpreparation.h"
 
-class PipeReport;
+class PipeHost;
 
 class OutputRun {
   public:
     // All are borrowed for the life of the object.
-    OutputRun(const OutputStreams& streams, const MuxerPlace& end, PipeReport& report)
-        : streams_(streams), end_(end), report_(report), preparation_(streams, end) {}
+    OutputRun(const OutputStreams& streams, const MuxerPlace& end, PipeHost& host)
+        : streams_(streams), end_(end), host_(host), preparation_(streams, end) {}
 
     // `makeFolder`: the folder of the file name is made when it is missing; if that fails it is only logged.
     // After a failure, and an exception, all members are closed. Disabled streams are not opened.
@@ -36,6 +36,6 @@ class OutputRun {
 
     const OutputStreams& streams_;
     const MuxerPlace& end_;
-    PipeReport& report_;
+    PipeHost& host_;
     OutputPreparation preparation_;
 };

@@ -1,6 +1,6 @@
 #include "builtin/pipes/output/pipestate.h"
 
-#include "builtin/pipes/output/members/pipereport.h"
+#include "builtin/pipes/output/members/pipehost.h"
 #include "core/arch/qvassert.h"
 #include "core/engine/status.h"
 #include "core/job/filtersstate.h"
@@ -87,20 +87,24 @@ AnyDict PipeState::storeStream(const OutputStream& stream) const {
 }
 
 int PipeState::restore(const AnyDict& state, const char* module) {
-    if (state.isSet("name") && !(state.get("name") == module))
-        report_.failHard(QvStatus::invalidStructure, "Cannot restore - invalid state structure.");
+    if (state.isSet("name") && !(state.get("name") == module)) {
+        host_.fail(QvStatus::invalidStructure, "Cannot restore - invalid state structure.");
+        QV_FAIL(host_.lastFailure());
+    }
     if (!state.isSet("__version__")) return restoreUnversioned(state);
     const Any& profile = state.get("profile");
-    if (!profile.isInt32())
-        report_.failHard(QvStatus::invalidStructure, "Cannot restore - 'profile' entry not set.");
+    if (!profile.isInt32()) {
+        host_.fail(QvStatus::invalidStructure, "Cannot restore - 'profile' entry not set.");
+        QV_FAIL(host_.lastFailure());
+    }
     if (const int result = restoreBase(profile.asInt32(), state.descendant("muxer.name"))) return result;
     end_.muxer()->restore(state.get("muxer").asDict());
     if (end_.hasPrograms() && state.get("programs").isVector()) {
         const auto programs = ProgramList::fromState(state.get("programs").asVector());
-        if (const int result = end_.programs().addAll(programs, report_)) return result;
+        if (const int result = end_.programs().addAll(programs, host_)) return result;
     }
     if (const int result = restoreStreams(state.get("streams"))) return result;
-    if (state.get("filename").isText()) end_.setFilename(state.get("filename"));
+    if (state.get("filename").isText()) host_.setFilename(state.get("filename"));
     if (state.get("createOutFolder").isInt32()) createOutFolder = state.get("createOutFolder").asInt32() != 0;
     return QvStatus::ok;
 }
@@ -109,11 +113,10 @@ int PipeState::restore(const AnyDict& state, const char* module) {
 int PipeState::restoreBase(int profile, const Any* muxer) {
     const int index = qvPresetMgr()->findByProfile(profile);
     if (index < 0)
-        return report_.fail(QvStatus::invalidStructure,
-                            "Cannot restore - base profile %d (%s) not available.", profile,
-                            qvProfileToSym(profile));
+        return host_.fail(QvStatus::invalidStructure, "Cannot restore - base profile %d (%s) not available.",
+                          profile, qvProfileToSym(profile));
     if (!muxer || !muxer->isString())
-        return report_.fail(QvStatus::failed, "Cannot restore - muxer entry not set");
+        return host_.fail(QvStatus::failed, "Cannot restore - muxer entry not set");
     builder_.removeAll(qvAllStreams);
     preset_.set(qvPresetMgr()->builtinPreset(index));
     return exchange_.start(muxer->asString());
@@ -161,8 +164,10 @@ int PipeState::restoreStream(const AnyDict& entry, int type) {
 // user's preset that was active is in "_userProfile".
 int PipeState::restoreUnversioned(const AnyDict& state) {
     const Any& number = state.get(state.get("_preset").isInt32() ? "_preset" : "_presetNr");
-    if (!number.isInt32())
-        report_.failHard(QvStatus::invalidStructure, "Cannot restore - 'profile' entry not set.");
+    if (!number.isInt32()) {
+        host_.fail(QvStatus::invalidStructure, "Cannot restore - 'profile' entry not set.");
+        QV_FAIL(host_.lastFailure());
+    }
     if (const int result = restoreBase(qvFixOldProfileNo(number.asInt32()), state.descendant("muxer.name")))
         return result;
     end_.muxer()->restore(state.get("muxer").asDict());
@@ -179,7 +184,7 @@ int PipeState::restoreUnversioned(const AnyDict& state) {
             preset_.follow(end_.muxer());
         }
     }
-    if (state.get("filename").isText()) end_.setFilename(state.get("filename"));
+    if (state.get("filename").isText()) host_.setFilename(state.get("filename"));
     return QvStatus::ok;
 }
 

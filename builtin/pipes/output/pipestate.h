@@ -8,13 +8,13 @@ class PipeState {
   public:
     // All are borrowed for the life of the object.
     PipeState(OutputStreams& streams, MuxerPlace& end, ActivePreset& preset, StreamBuilder& builder,
-              MuxerExchange& exchange, PipeReport& report)
+              MuxerExchange& exchange, PipeHost& host)
         : streams_(streams),
           end_(end),
           preset_(preset),
           builder_(builder),
           exchange_(exchange),
-          report_(report) {}
+          host_(host) {}
 
     bool createOutFolder = false;  // whether opening makes the folder of the file name
 
@@ -38,5 +38,5 @@ class PipeState {
     ActivePreset& preset_;
     StreamBuilder& builder_;
     MuxerExchange& exchange_;
-    PipeReport& report_;
+    PipeHost& host_;
 };

@@ -2,7 +2,7 @@
 
 #include <algorithm>
 
-#include "builtin/pipes/output/members/pipereport.h"
+#include "builtin/pipes/output/members/pipehost.h"
 #include "core/engine/log/qvlog.h"
 #include "core/engine/modules/qvregistry.h"
 #include "core/engine/status.h"
@@ -21,7 +21,7 @@ bool isDv100(int profile) {
 
 int PresetApplier::applyBuiltin(int profile, bool keepFilters) {
     const int index = qvPresetMgr()->findByProfile(profile);
-    if (index < 0) return report_.fail(QvStatus::invalidStructure, "Invalid preset #%d", profile);
+    if (index < 0) return host_.fail(QvStatus::invalidStructure, "Invalid preset #%d", profile);
     const QvPreset preset = qvPresetMgr()->builtinPreset(index);
     qv_dbg()->info("[Encode Pipe] Applying built-in preset %s(%d), nr=%d", preset.name(), preset.profile(),
                    index);
@@ -49,11 +49,11 @@ int PresetApplier::build(const QvPreset& preset, const std::vector<StreamSnapsho
 int PresetApplier::startMuxer(const QvPreset& preset, const char* preferred) {
     const Any muxer = preferred ? Any(preferred) : preset.defaultMuxer();
     if (!muxer.isString())
-        return report_.fail(QvStatus::failed, "Preset '%s' has no multiplexer that is installed",
-                            preset.name());
+        return host_.fail(QvStatus::failed, "Preset '%s' has no multiplexer that is installed",
+                          preset.name());
     if (const int result = exchange_.start(muxer.asString())) return result;
     if (!end_.hasPrograms()) return QvStatus::ok;
-    return end_.programs().addAll(ProgramList::fromState(preset.programs()), report_);
+    return end_.programs().addAll(ProgramList::fromState(preset.programs()), host_);
 }
 
 int PresetApplier::addDefaultStreams(const QvPreset& preset) {
@@ -83,9 +83,9 @@ int PresetApplier::apply(const QvPreset& given, bool keepFilters, const char* mo
     qv_dbg()->info("Applying custom preset '%s'.", preset.name());
     const int base = qvPresetMgr()->findByProfile(preset.profile());
     if (base < 0)
-        return report_.fail(QvStatus::invalidStructure,
-                            "Cannot apply preset '%s', base profile %s (%d) not loaded.", preset.name(),
-                            qvProfileToSym(preset.profile()), preset.profile());
+        return host_.fail(QvStatus::invalidStructure,
+                          "Cannot apply preset '%s', base profile %s (%d) not loaded.", preset.name(),
+                          qvProfileToSym(preset.profile()), preset.profile());
     const auto former = StreamSnapshot::all(streams_, end_.muxer());
     builder_.removeAll(qvAllStreams);
     const bool whole = preset.get("muxer").isDict() && preset.get("streams").isVector();
@@ -137,8 +137,8 @@ int PresetApplier::addPresetStreams(const QvPreset& preset) {
         }
     }
     if (failed > 0)
-        return report_.fail(QvStatus::failed, "Preset '%s' applied with errors, failed to add some streams.",
-                            preset.name());
+        return host_.fail(QvStatus::failed, "Preset '%s' applied with errors, failed to add some streams.",
+                          preset.name());
     if (over > 0)
         qv_dbg()->warning("Preset '%s' applied, %d streams not added due to preset/muxer limitation",
                           preset.name(), over);

@@ -9,14 +9,14 @@ class PresetApplier {
   public:
     // All are borrowed for the life of the object.
     PresetApplier(OutputStreams& streams, MuxerPlace& end, ActivePreset& preset, StreamBuilder& builder,
-                  MuxerExchange& exchange, PipeState& state, PipeReport& report)
+                  MuxerExchange& exchange, PipeState& state, PipeHost& host)
         : streams_(streams),
           end_(end),
           preset_(preset),
           builder_(builder),
           exchange_(exchange),
           state_(state),
-          report_(report) {}
+          host_(host) {}
 
     // The built-in preset of a profile.
     int applyBuiltin(int profile, bool keepFilters);
@@ -38,5 +38,5 @@ class PresetApplier {
     StreamBuilder& builder_;
     MuxerExchange& exchange_;
     PipeState& state_;
-    PipeReport& report_;
+    PipeHost& host_;
 };

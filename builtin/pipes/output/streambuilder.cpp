@@ -1,6 +1,6 @@
 #include "builtin/pipes/output/streambuilder.h"
 
-#include "builtin/pipes/output/members/pipereport.h"
+#include "builtin/pipes/output/members/pipehost.h"
 #include "core/arch/qvassert.h"
 #include "core/engine/log/qvlog.h"
 #include "core/engine/modules/qvmodule.h"
@@ -55,7 +55,7 @@ int StreamBuilder::room(int type) const {
 int StreamBuilder::checkRoom(int type) {
     QV_ASSERT_MSG(end_.muxer(), "EncodePipe: muxer is null.");
     if (type == qvSubpicStream || room(type) >= 1) return QvStatus::ok;
-    return report_.fail(QvStatus::noStream, "%s", textsOf(type).full);
+    return host_.fail(QvStatus::noStream, "%s", textsOf(type).full);
 }
 
 int StreamBuilder::add(int type, const Any& argument) {
@@ -75,10 +75,10 @@ int StreamBuilder::build(int type, StreamRequest request) {
     const auto& texts = textsOf(type);
     if (const int result = complete(type, request)) return result;
     const char* codec = request.codec.c_str();
-    if (request.codec.empty()) return report_.fail(QvStatus::noStream, "%s", texts.noCodec);
+    if (request.codec.empty()) return host_.fail(QvStatus::noStream, "%s", texts.noCodec);
     auto encoder = newEncoder(type, codec);
-    if (!encoder) return report_.fail(QvStatus::failed, texts.notCreated, codec);
-    if (const int result = setUp(*encoder, request.settings)) return report_.take(*encoder, result);
+    if (!encoder) return host_.fail(QvStatus::failed, texts.notCreated, codec);
+    if (const int result = setUp(*encoder, request.settings)) return host_.take(*encoder, result);
     auto stream = std::make_unique<OutputStream>(type);
     stream->take(std::move(encoder));
     return append(std::move(stream), request.params ? *request.params : AnyDict(), codec);
@@ -89,12 +89,11 @@ int StreamBuilder::complete(int type, StreamRequest& request) {
     const QvMuxer& muxer = *end_.muxer();
     if (codec) {
         if (!qv_registry()->module(codec))
-            return report_.fail(QvStatus::failed, "Cannot add stream: encoder '%s' not loaded", codec);
+            return host_.fail(QvStatus::failed, "Cannot add stream: encoder '%s' not loaded", codec);
         if (!preset_.takes(codec, muxer))
-            return report_.fail(
-                QvStatus::failed,
-                "Encoder %s not compatible with currently selected preset %s and/or muxer %s.", codec,
-                preset_.preset().name(), muxer.name());
+            return host_.fail(QvStatus::failed,
+                              "Encoder %s not compatible with currently selected preset %s and/or muxer %s.",
+                              codec, preset_.preset().name(), muxer.name());
     } else if (preset_.preset().isBuiltin() && preset_.codecs(type).empty()) {
         return QvStatus::ok;
     }
@@ -116,7 +115,7 @@ int StreamBuilder::append(std::unique_ptr<OutputStream> stream, const AnyDict& p
     const auto& added = streams_.append(std::move(stream));
     const int nr = streams_.numberOf(added);
     if (!params.empty()) end_.muxer()->setStreamParams(type, nr, params);
-    qv_dbg()->debug(textsOf(type).added, report_.pipe(), nr, name, static_cast<void*>(added.encoder),
+    qv_dbg()->debug(textsOf(type).added, host_.pipe(), nr, name, static_cast<void*>(added.encoder),
                     static_cast<void*>(added.bitstream));
     return nr;
 }
@@ -127,10 +126,13 @@ int StreamBuilder::join(OutputStream& stream, const char* name) {
     const Any extension = static_cast<const QvCodec*>(stream.encoder)->getParam("extension");
     if (extension.isValid()) about.set("extension", extension);
     stream.bitstream = muxer.addStream(stream.type, about);
-    if (!stream.bitstream) report_.failHard(QvStatus::failed, "QvMuxer.addStream() failed");
+    if (!stream.bitstream) {
+        host_.fail(QvStatus::failed, "QvMuxer.addStream() failed");
+        QV_FAIL(host_.lastFailure());
+    }
     const int result = stream.encoder->attachOutStream(stream.bitstream);
     if (result == QvStatus::ok) return result;
-    report_.take(*stream.encoder, result);
+    host_.take(*stream.encoder, result);
     muxer.removeStream(stream.type, muxer.nrStreams(stream.type) - 1);
     return result;
 }
@@ -140,14 +142,14 @@ int StreamBuilder::buildSubpic(const StreamRequest& request) {
     auto stream = std::make_unique<OutputStream>(qvSubpicStream);
     stream->bitstream = muxer.addStream(qvSubpicStream, request.params ? *request.params : AnyDict());
     if (!stream->bitstream) {
-        qv_dbg()->error("[EncodePipe %p] Failed to add subpic stream to muxer '%s'", report_.pipe(),
+        qv_dbg()->error("[EncodePipe %p] Failed to add subpic stream to muxer '%s'", host_.pipe(),
                         muxer.name());
-        return report_.fail(QvStatus::failed, "Failed to add subpic stream to muxer '%s'", muxer.name());
+        return host_.fail(QvStatus::failed, "Failed to add subpic stream to muxer '%s'", muxer.name());
     }
     const auto& added = streams_.append(std::move(stream));
     const int nr = streams_.numberOf(added);
     if (request.params) muxer.setStreamParams(qvSubpicStream, nr, *request.params);
-    qv_dbg()->debug("[EncodePipe %p] Added subpic #%d, bs=%p", report_.pipe(), nr,
+    qv_dbg()->debug("[EncodePipe %p] Added subpic #%d, bs=%p", host_.pipe(), nr,
                     static_cast<void*>(added.bitstream));
     return nr;
 }
@@ -162,7 +164,7 @@ void StreamBuilder::remove(const QvOStream* wanted) {
     if (auto* muxer = end_.muxer()) muxer->removeStream(type, nr);
     stream.bitstream = nullptr;
     streams_.remove(static_cast<std::size_t>(place));
-    qv_dbg()->debug("[EncodePipe %p] Removed %s #%d", report_.pipe(), qvStreamTypeName(type), nr);
+    qv_dbg()->debug("[EncodePipe %p] Removed %s #%d", host_.pipe(), qvStreamTypeName(type), nr);
 }
 
 void StreamBuilder::removeAll(int mask) {
@@ -173,7 +175,7 @@ void StreamBuilder::removeAll(int mask) {
         const int nr = streams_.numberOf(stream);
         detach(stream);
         stream.bitstream = nullptr;
-        qv_dbg()->debug("[EncodePipe %p] Removed %s #%d", report_.pipe(), qvStreamTypeName(stream.type), nr);
+        qv_dbg()->debug("[EncodePipe %p] Removed %s #%d", host_.pipe(), qvStreamTypeName(stream.type), nr);
         removed.push_back(streams_.remove(place));
     }
     if (auto* muxer = end_.muxer()) muxer->removeStreams(mask);
@@ -181,21 +183,23 @@ void StreamBuilder::removeAll(int mask) {
 
 int StreamBuilder::setCodec(int type, int nr, const char* name, const AnyDict& params, bool adjustToMuxer) {
     auto* stream = streams_.find(type, nr);
-    if (!stream || !stream->encoder)
-        report_.failHard(QvStatus::invalidArgument, "[EncodePipe] setCodec: Invalid stream number %d", nr);
+    if (!stream || !stream->encoder) {
+        host_.fail(QvStatus::invalidArgument, "[EncodePipe] setCodec: Invalid stream number %d", nr);
+        QV_FAIL(host_.lastFailure());
+    }
     QV_ASSERT(name);
     if (!preset_.takes(name, *end_.muxer()))
-        return report_.fail(
+        return host_.fail(
             QvStatus::failed,
             "Video encoder '%s' not compatible with currently selectedpreset '%s' and/or muxer '%s'", name,
             preset_.preset().name(), end_.muxer()->name());
     auto fresh = newEncoder(type, name);
-    if (!fresh) return report_.fail(QvStatus::failed, "Could not create %s instance", name);
+    if (!fresh) return host_.fail(QvStatus::failed, "Could not create %s instance", name);
     saved_.keep(*stream->encoder);
     detach(*stream);
     stream->take(std::move(fresh));
     if (const int result = stream->encoder->attachOutStream(stream->bitstream))
-        return report_.take(*stream->encoder, result);
+        return host_.take(*stream->encoder, result);
     return configure(*stream->encoder, type, nr, params, adjustToMuxer);
 }
 
@@ -218,7 +222,7 @@ int StreamBuilder::configure(QvEncoder& encoder, int type, int nr, const AnyDict
             qvOfferParam(encoder, "tsAdjust", 1);
     }
     qvOfferParam(encoder, "adjustSettings", 1);
-    return result == QvStatus::ok ? result : report_.take(encoder, result);
+    return result == QvStatus::ok ? result : host_.take(encoder, result);
 }
 
 void StreamBuilder::adjustForTransport() {

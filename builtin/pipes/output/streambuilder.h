@@ -14,13 +14,13 @@
 #include "builtin/pipes/output/members/savedsettings.h"
 #include "builtin/pipes/output/members/streamrequest.h"
 
-class PipeReport;
+class PipeHost;
 
 class StreamBuilder {
   public:
     // All are borrowed for the life of the builder.
-    StreamBuilder(OutputStreams& streams, MuxerPlace& end, const ActivePreset& preset, PipeReport& report)
-        : streams_(streams), end_(end), preset_(preset), report_(report) {}
+    StreamBuilder(OutputStreams& streams, MuxerPlace& end, const ActivePreset& preset, PipeHost& host)
+        : streams_(streams), end_(end), preset_(preset), host_(host) {}
 
     // How many more streams of a type fit, as QvEncodePipe::canAddStreams.
     int room(int type) const;
@@ -56,6 +56,6 @@ class StreamBuilder {
     OutputStreams& streams_;
     MuxerPlace& end_;
     const ActivePreset& preset_;
-    PipeReport& report_;
+    PipeHost& host_;
     SavedSettings saved_;
 };

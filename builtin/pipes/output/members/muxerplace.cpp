@@ -1,6 +1,6 @@
 #include "builtin/pipes/output/members/muxerplace.h"
 
-#include "builtin/pipes/output/members/pipereport.h"
+#include "builtin/pipes/output/members/pipehost.h"
 #include "core/arch/qvassert.h"
 #include "core/encode/muxerlimits_p.h"
 #include "core/engine/modules/qvmodule.h"
@@ -26,7 +26,7 @@ int MuxerPlace::setSink(const char* module) {
     QV_ASSERT(module && *module);
     std::unique_ptr<QvCodec> fresh(qv_registry()->newCodec(module));
     if (!fresh || !fresh->getInterface(QvModuleType::sink))
-        return report_.fail(QvStatus::failed, "[EncodePipe2] setSink: Invalid module %s", module);
+        return host_.fail(QvStatus::failed, "[EncodePipe2] setSink: Invalid module %s", module);
     if (muxer_) muxer_->detachOutStream();
     sink_.reset(static_cast<QvSink*>(fresh.release()));
     sinkName_ = module;
@@ -61,10 +61,11 @@ void MuxerPlace::restoreSettings(const QvPreset& preset) {
     if (!preset.isCustom()) return;
     const AnyDict stored = preset.muxerParams();
     if (stored.empty()) return;
-    if (!(stored.get("name") == muxer_->name()))
-        report_.failHard(QvStatus::failed,
-                         "_setMuxer - stored muxer parameters don't match current muxer '%s'?",
-                         muxer_->name());
+    if (!(stored.get("name") == muxer_->name())) {
+        host_.fail(QvStatus::failed, "_setMuxer - stored muxer parameters don't match current muxer '%s'?",
+                   muxer_->name());
+        QV_FAIL(host_.lastFailure());
+    }
     muxer_->restore(stored);
 }
 

@@ -10,12 +10,12 @@
 #include "core/encode/qvmuxer.h"
 #include "core/encode/qvsink.h"
 
-class PipeReport;
+class PipeHost;
 class QvPreset;
 
 class MuxerPlace {
   public:
-    explicit MuxerPlace(PipeReport& report) : report_(report) {}
+    explicit MuxerPlace(PipeHost& host) : host_(host) {}
     ~MuxerPlace() { drop(); }
     MuxerPlace(const MuxerPlace&) = delete;
     MuxerPlace& operator=(const MuxerPlace&) = delete;
@@ -64,7 +64,7 @@ class MuxerPlace {
   private:
     int offerFilename();
 
-    PipeReport& report_;
+    PipeHost& host_;
     // In this order: the multiplexer goes before the sink whose stream it holds.
     std::unique_ptr<QvSink> sink_;
     std::unique_ptr<QvMuxer> muxer_;

@@ -2,7 +2,7 @@
 
 #include <algorithm>
 
-#include "builtin/pipes/output/members/pipereport.h"
+#include "builtin/pipes/output/members/pipehost.h"
 
 void OutputStream::take(std::unique_ptr<QvEncoder> fresh) {
     encoder = fresh.get();

@@ -1,6 +1,6 @@
 #include "builtin/pipes/output/members/programlist.h"
 
-#include "builtin/pipes/output/members/pipereport.h"
+#include "builtin/pipes/output/members/pipehost.h"
 #include "core/arch/qvassert.h"
 #include "core/engine/status.h"
 
@@ -39,11 +39,11 @@ std::vector<QvProgram> ProgramList::all() const {
     return programs;
 }
 
-int ProgramList::addAll(const std::vector<QvProgram>& programs, PipeReport& report) {
+int ProgramList::addAll(const std::vector<QvProgram>& programs, PipeHost& host) {
     if (!setup_) return QvStatus::ok;
     for (const auto& program : programs)
         if (setup_->addProgram(program) < 0)
-            return report.fail(QvStatus::failed, "EncodePipe.restore: failed to add program");
+            return host.fail(QvStatus::failed, "EncodePipe.restore: failed to add program");
     return QvStatus::ok;
 }
 

@@ -5,7 +5,7 @@
 
 #include "core/encode/qvmuxer.h"
 
-class PipeReport;
+class PipeHost;
 
 class ProgramList {
   public:
@@ -22,7 +22,7 @@ class ProgramList {
 
     std::vector<QvProgram> all() const;
     // Nothing without the interface. A program that is refused ends it and is a failure of the pipe.
-    int addAll(const std::vector<QvProgram>& programs, PipeReport& report);
+    int addAll(const std::vector<QvProgram>& programs, PipeHost& host);
 
     // The stored form: dictionaries of "program_PID", "program_number" and "PCR_PID"; other elements are
     // passed over.

@@ -1,38 +1,22 @@
-#include "builtin/pipes/output/members/pipereport.h"
+#include "builtin/pipes/output/members/pipehost.h"
 
 #include <cstdarg>
 
 #include "core/arch/formattext_p.h"
-#include "core/arch/qvassert.h"
 #include "core/arch/qvexception.h"
 #include "core/engine/modules/qvcodec.h"
 #include "core/engine/status.h"
 
-namespace {
-
-using Text = QvFormattedText<1023>;
-
-}  // namespace
-
-int PipeReport::fail(int code, const char* format, ...) {
+int PipeHost::fail(int code, const char* format, ...) {
     va_list args;
     va_start(args, format);
-    const Text text(format, args);
+    const QvFormattedText<1023> text(format, args);
     va_end(args);
     storeFailure(code, text.text());
     return code;
 }
 
-void PipeReport::failHard(int code, const char* format, ...) {
-    va_list args;
-    va_start(args, format);
-    const Text text(format, args);
-    va_end(args);
-    storeFailure(code, text.text());
-    QV_FAIL(text.text());
-}
-
-int PipeReport::take(const QvCodec& member, int result) {
+int PipeHost::take(const QvCodec& member, int result) {
     storeFailure(member.errorCode() != 0 ? member.errorCode() : result, member.errorDesc());
     return result;
 }
