@@ -21,7 +21,7 @@ FACES = {
 OPEN = {
     "Any", "AnyDict", "AnyVector", "Job", "QvBitrate", "QvCcData", "QvCodec", "QvFile", "QvFrame",
     "QvFramerate", "QvProcessUtil", "QvRegistry", "QvTask", "QvTranscodeRun", "RawAudioEnc",
-    "RawAviMux", "RawMux", "RawVideoEnc", "TransALink", "TransVLink", "XmlNode", "XmlParser",
+    "RawVideoEnc", "TransALink", "TransVLink", "XmlNode", "XmlParser",
     "XmlTrans",
 }
 
