@@ -3,6 +3,7 @@
 
 #include <cstdint>
 
+#include "builtin/encoders/rawaencsettings.h"
 #include "core/encode/qvencoder.h"
 #include "core/engine/modules/qvmodule.h"
 
@@ -29,19 +30,12 @@ class RawAudioEnc : public QvAudioEncoder {
     int writePcm(QvPcm* pcm, int samples = -1) override;
 
   private:
-    friend struct RawAudioParams;
-
     int putHeader(class RawOutput& output);
     bool announcesUnits() const;
     int putUnits(RawOutput& output, const unsigned char* data, uint64_t bytes);
     int putUnit(RawOutput& output, const unsigned char* data, uint64_t bytes);
-    int bytesPerSample() const { return channels_ * ((bitsPerSample_ + 7) / 8); }
 
-    int samplerate_ = 48000;
-    int channels_ = 2;
-    int bitsPerSample_ = 16;
-    int profile_ = -1;
-    int type_ = 0;
+    RawAudioSettings settings_;
     bool headerDue_ = false;
     Any muxer_;  // name of the multiplexer, "N/A" when there is none
 };

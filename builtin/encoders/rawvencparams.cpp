@@ -124,7 +124,9 @@ void RawVideoEnc::getParam(const char* name, Any& value) const {
     if (!qvGetParamRow(RawVideoParams::rows(), *this, name, value)) QvVideoEncoder::getParam(name, value);
 }
 
-void RawVideoEnc::store(AnyDict& state) const { state = rawsettings::stored(RawVideoParams::rows(), *this); }
+void RawVideoEnc::store(AnyDict& state) const {
+    state = rawsettings::stored(name(), RawVideoParams::rows(), *this);
+}
 
 int RawVideoEnc::restore(const AnyDict& state) {
     if (state.get("name") != name()) return setError(QvStatus::failed, "restore - invalid name");
