@@ -33,7 +33,6 @@ OPEN = {
     "QvRegistry",
     "QvTask",
     "QvTranscodeRun",
-    "RawVideoEnc",
     "TransALink",
     "TransVLink",
     "XmlNode",
