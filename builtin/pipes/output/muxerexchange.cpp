@@ -11,7 +11,8 @@ int MuxerExchange::change(const char* module) { return put(module, true); }
 int MuxerExchange::start(const char* module) { return put(module, false); }
 
 int MuxerExchange::put(const char* module, bool keepStreams) {
-    if (const char* sink = muxerTraits(module).companionSink) return putInternal(module, sink);
+    const auto traits = MuxerTraits::of(module, qv_registry()->module(module));
+    if (!traits.companionSink.empty()) return putInternal(module, traits.companionSink.c_str());
     QV_ASSERT_MSG(keepStreams || streams_.empty(),
                   "EncodePipe._setMuxer: streams not removed while changingPreset");
     if (!qv_registry()->module(module))
@@ -42,7 +43,7 @@ int MuxerExchange::replace(std::unique_ptr<QvMuxer> fresh, bool keepStreams) {
     std::vector<StreamSnapshot> former;
     std::vector<QvProgram> programs;
     MuxerPlace::Handover carried;
-    const bool wasInternal = end_.traits().companionSink;
+    const bool wasInternal = !end_.traits().companionSink.empty();
     if (end_.muxer() && keepStreams) {
         former = StreamSnapshot::all(streams_, end_.muxer());
         programs = end_.programs().all();

@@ -31,7 +31,7 @@ void ActivePreset::switchTo(const QvPreset& preset, const char* otherProfile) {
 
 void ActivePreset::follow(const QvMuxer* muxer) {
     const char* name = muxer ? muxer->name() : "";
-    const bool all = muxerTraits(name).anyCodec;
+    const bool all = MuxerTraits::of(muxer).anyCodec;
     const auto allowed = [&](int kind) {
         return all ? preset_.codecs(kind) : preset_.getCompatible(name, kind);
     };
@@ -45,7 +45,7 @@ const AnyVector& ActivePreset::codecs(int type) const {
 }
 
 bool ActivePreset::takes(const char* codec, const QvMuxer& muxer) const {
-    return muxerTraits(muxer.name()).anyCodec || preset_.isCompatible(codec, muxer.name());
+    return MuxerTraits::of(&muxer).anyCodec || preset_.isCompatible(codec, muxer.name());
 }
 
 AnyDict ActivePreset::lists() const {

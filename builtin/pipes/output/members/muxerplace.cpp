@@ -38,6 +38,12 @@ int MuxerPlace::setSink(const char* module) {
 void MuxerPlace::drop() {
     if (muxer_) muxer_->detachOutStream();
     muxer_.reset();
+    traits_ = {};
+}
+
+void MuxerPlace::put(std::unique_ptr<QvMuxer> muxer) {
+    muxer_ = std::move(muxer);
+    traits_ = MuxerTraits::of(muxer_.get());
 }
 
 void MuxerPlace::attach() {

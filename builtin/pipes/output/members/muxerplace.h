@@ -24,7 +24,7 @@ class MuxerPlace {
     QvSink* sink() const { return sink_.get(); }
     const Any& sinkName() const { return sinkName_; }
     // Of the multiplexer that stands here; the defaults without one.
-    const MuxerTraits& traits() const { return muxerTraits(muxer_ ? muxer_->name() : nullptr); }
+    const MuxerTraits& traits() const { return traits_; }
     ProgramList programs() const { return ProgramList(muxer_.get()); }
     bool hasPrograms() const;
     // How many streams of the type can still be added; a missing multiplexer is an assertion.
@@ -37,7 +37,7 @@ class MuxerPlace {
     // Detaches and deletes the multiplexer; its settings are not kept.
     void drop();
     // Takes the multiplexer, which is not attached yet.
-    void put(std::unique_ptr<QvMuxer> muxer) { muxer_ = std::move(muxer); }
+    void put(std::unique_ptr<QvMuxer> muxer);
     // Lets the multiplexer write into the sink.
     void attach();
 
@@ -68,6 +68,7 @@ class MuxerPlace {
     // In this order: the multiplexer goes before the sink whose stream it holds.
     std::unique_ptr<QvSink> sink_;
     std::unique_ptr<QvMuxer> muxer_;
+    MuxerTraits traits_;  // of muxer_, read once
     Any sinkName_ = "filesink";
     Any filename_;
     SavedSettings saved_;

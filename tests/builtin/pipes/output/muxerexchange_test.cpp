@@ -40,17 +40,22 @@ TEST_F(Exchange, StreamsKeepTheirOrderEncodersFiltersAndSwitch) {
     EXPECT_EQ(streams_[2].bitstream, end_.muxer()->stream(qvVideoStream, 1));
 }
 
-// A multiplexer that the catalogue of presets allows for sound only.
+// A multiplexer that the catalogue of presets allows for sound only; it has no attributes of its own.
 struct SoundMuxer : QvModule {
     SoundMuxer() : QvModule(QvModuleType::muxer, "mvrawmux", "", "mvrawmux") {}
     QvCodec* create() override { return _setAttrs(new RawMux); }
 };
 
-TEST_F(Exchange, StreamsWithoutACodecAreLeftOut) {
+QvModule& installSoundMuxer() {
     static QvPlugin plugin("sound", "");
     if (plugin.nrModules() == 0) plugin.addModule(new SoundMuxer);
     qv_registry()->addPlugin(&plugin);
     qvPresetMgr()->update();
+    return *qv_registry()->module("mvrawmux");
+}
+
+TEST_F(Exchange, StreamsWithoutACodecAreLeftOut) {
+    installSoundMuxer();
     builder_.addDefault(qvVideoStream);
     builder_.addDefault(qvAudioStream);
     LogCapture log;
@@ -89,6 +94,33 @@ TEST_F(Exchange, TheEnginesOwnMultiplexersBringTheirSink) {
         EXPECT_EQ(streams_.count(qvVideoStream), 1);
         builder_.removeAll(qvAllStreams);
     }
+}
+
+TEST_F(Exchange, AttributesOfAModuleOverrideTheTableOfNames) {
+    auto& module = installSoundMuxer();
+    const struct {
+        const char* attribute;
+        Any value;
+        bool MuxerTraits::*trait;
+    } cases[] = {{"anyCodec", 1, &MuxerTraits::anyCodec},
+                 {"transportStream", 1, &MuxerTraits::transportStream},
+                 {"manyPrograms", 1, &MuxerTraits::manyPrograms},
+                 {"sizedStreams", 1, &MuxerTraits::sizedStreams}};
+    for (const auto& [attribute, value, trait] : cases) {
+        EXPECT_FALSE(MuxerTraits::of("mvrawmux", &module).*trait) << attribute;
+        module.setAttr(attribute, value);
+        EXPECT_TRUE(MuxerTraits::of("mvrawmux", &module).*trait) << attribute;
+        module.setAttr(attribute, 0);
+        for (const char* named : {"memmux", "mptsmux", "mpegtsmux", "rawmux"})
+            EXPECT_FALSE(MuxerTraits::of(named, &module).*trait) << named;
+    }
+    module.setAttr("anyCodec", 1);
+    module.setAttr("companionSink", "nullsink");
+    ASSERT_EQ(exchange_.change("mvrawmux"), 0);
+    EXPECT_STREQ(end_.sink()->name(), "nullsink");
+    EXPECT_EQ(preset_.codecs(qvVideoStream).size(), 1) << "the catalogue knows none for it";
+    module.setAttr("companionSink", Any());
+    for (const auto& [attribute, value, trait] : cases) module.setAttr(attribute, Any());
 }
 
 TEST_F(Exchange, ARefusalChangesNothing) {
