@@ -56,8 +56,6 @@ const OwnParam* findOwn(const char* name) {
 
 }  // namespace
 
-EncodePipe2::EncodePipe2() = default;
-
 EncodePipe2::~EncodePipe2() {
     if (getState() == qvStateOpen) finish(true);
     builder_.removeAll(qvAllStreams);

@@ -21,16 +21,20 @@
 // and the multiplexer; a member that does not know one is passed over. "filesWritten" answers the files that
 // the last run made, finished or not (QvMuxer, FileSink).
 //
-// The pipe keeps the rules of its states and its parameters. The rest is done by its parts, each on those
+// The pipe itself checks its state and takes its parameters. Its parts do the rest; each uses only those
 // above it:
 //
-//     streams_    the list of streams          end_        multiplexer and sink
-//     preset_     what is allowed              builder_    adds and removes streams
-//     exchange_   another multiplexer          state_      store and restore
-//     applier_    another preset               run_        open and close
+//     streams_     the list of streams
+//     end_         multiplexer and sink
+//     preset_      the preset and the modules that it allows
+//     builder_     adds and removes streams, exchanges encoders
+//     exchange_    exchanges the multiplexer
+//     state_       store and restore
+//     applier_     applies a preset
+//     run_         opens and closes
 class EncodePipe2 : public QvEncodePipe, public QvIProgramSetup, private PipeHost {
   public:
-    EncodePipe2();
+    EncodePipe2() = default;
     ~EncodePipe2() override;
 
     int init() override;

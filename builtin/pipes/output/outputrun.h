@@ -19,10 +19,10 @@ class OutputRun {
         : streams_(streams), end_(end), host_(host), preparation_(streams, end) {}
 
     // `makeFolder`: the folder of the file name is made when it is missing; if that fails it is only logged.
-    // After a failure, and an exception, all members are closed. Disabled streams are not opened.
+    // After a failure or an exception all members are closed. Disabled streams are not opened.
     int open(bool makeFolder);
-    // Every member is finished, whatever another one does; its failure, a broken contract and want of memory
-    // included, is the pipe's. Results ORed.
+    // Every member is finished, even when another one fails. A failure, a broken contract and want of memory
+    // become the pipe's failure. Results ORed.
     int finish(bool aborting);
 
   private:

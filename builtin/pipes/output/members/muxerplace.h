@@ -1,5 +1,5 @@
-// The end of an output: the sink, the multiplexer that writes into it, and what either has from the other or
-// from those that stood here before.
+// The end of an output: the sink and the multiplexer that writes into it. Either can be exchanged; the file
+// name and the settings of earlier multiplexers are kept for the new one.
 #pragma once
 
 #include <memory>
@@ -23,16 +23,16 @@ class MuxerPlace {
     QvMuxer* muxer() const { return muxer_.get(); }  // null before the first preset
     QvSink* sink() const { return sink_.get(); }
     const Any& sinkName() const { return sinkName_; }
-    // Of the multiplexer that stands here; the defaults without one.
+    // Of the present multiplexer; the defaults without one.
     const MuxerTraits& traits() const { return traits_; }
     ProgramList programs() const { return ProgramList(muxer_.get()); }
     bool hasPrograms() const;
     // How many streams of the type can still be added; a missing multiplexer is an assertion.
     int room(int type, int ofThis, int inAll) const;
 
-    // A new multiplexer or sink of a module; null when there is none of that kind.
+    // A new multiplexer; null when there is no such module, or it is of another kind.
     static std::unique_ptr<QvMuxer> newMuxer(const char* module);
-    // Exchanges the sink. The multiplexer writes into the new one. A failure leaves all as it was.
+    // Exchanges the sink. The multiplexer writes into the new one. A failure changes nothing.
     int setSink(const char* module);
     // Detaches and deletes the multiplexer; its settings are not kept.
     void drop();

@@ -1,4 +1,4 @@
-// The programs of a multiplexer, which has them only when it answers the interface for them.
+// The programs of a multiplexer. Without QvIProgramSetup (core/encode/qvmuxer.h) it has none.
 #pragma once
 
 #include <vector>
@@ -12,7 +12,7 @@ class ProgramList {
     // `muxer` is borrowed and may be null.
     explicit ProgramList(const QvMuxer* muxer);
 
-    // Failed, or 0 programs, without the interface.
+    // As in QvIProgramSetup. Without it 0 programs, and QvStatus::failed.
     int count() const;
     int add(const QvProgram& program);
     int remove(int index);  // an index outside the list is an assertion
@@ -21,7 +21,8 @@ class ProgramList {
     int streams(int index, AnyVector& pairs) const;
 
     std::vector<QvProgram> all() const;
-    // Nothing without the interface. A program that is refused ends it and is a failure of the pipe.
+    // Does nothing without QvIProgramSetup. Stops at the first program that is refused, which is a failure of
+    // the pipe.
     int addAll(const std::vector<QvProgram>& programs, PipeHost& host);
 
     // The stored form: dictionaries of "program_PID", "program_number" and "PCR_PID"; other elements are
