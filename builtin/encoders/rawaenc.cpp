@@ -19,6 +19,23 @@ namespace {
 
 constexpr unsigned announcedInfoBytes = 16;
 
+struct Row {
+    const char* muxer;
+    RawAudioTarget target;
+};
+
+constexpr Row targets[] = {
+    {"rawmux", {.announcedUnits = true, .markedEnd = true}},
+    {"memmux", {.announcedUnits = true}},
+    {"mxfmux", {.lpcmHeader = true}},
+};
+
+RawAudioTarget targetOf(const char* muxer) {
+    for (const auto& row : targets)
+        if (std::strcmp(row.muxer, muxer) == 0) return row.target;
+    return {};
+}
+
 }  // namespace
 
 RawAudioEnc::~RawAudioEnc() {
@@ -64,7 +81,7 @@ int RawAudioEnc::open() {
     QV_ASSERT_MSG(getState() == stateInitialised, "not inited");
     if (!outStream()) return setError(QvStatus::failed, "Output stream not attached");
     const auto* muxer = qvMuxerOf(*outStream());
-    muxer_ = muxer ? muxer->name() : "N/A";
+    target_ = targetOf(muxer ? muxer->name() : "");
     outStream()->setParam("rawaenc.audioSettings",
                           AnyDict("samplerate", settings_.samplerate, "channels", settings_.channels,
                                   "bits_per_sample", settings_.bitsPerSample));
@@ -88,7 +105,7 @@ int RawAudioEnc::writePcm(QvPcm* pcm, int samples) {
     RawOutput output(*outStream());
     if (headerDue_) {
         headerDue_ = false;
-        if (muxer_ == "mxfmux")
+        if (target_.lpcmHeader)
             if (const int result = putHeader(output)) return result;
     }
     if (samples == 0) return QvStatus::ok;
@@ -106,18 +123,15 @@ int RawAudioEnc::putHeader(RawOutput& output) {
     return putUnit(output, header, sizeof header);
 }
 
-// These empty their ring at each announcement, so units that it can't hold at once go in pieces.
-bool RawAudioEnc::announcesUnits() const { return muxer_ == "rawmux" || muxer_ == "memmux"; }
-
 int RawAudioEnc::putUnits(RawOutput& output, const unsigned char* data, uint64_t bytes) {
     const auto sample = static_cast<uint64_t>(settings_.bytesPerSample());
     uint64_t unit = bytes;
-    if (announcesUnits() && output.largestBlock() >= sample)
+    if (target_.announcedUnits && output.largestBlock() >= sample)
         unit = std::min<uint64_t>(bytes, output.largestBlock() / sample * sample);
     for (; bytes > 0; data += unit, bytes -= unit) {
         unit = std::min(unit, bytes);
         if (const int result = putUnit(output, data, unit)) return result;
-        if (announcesUnits()) {
+        if (target_.announcedUnits) {
             if (const int answer = output.announce(QvAuxId::AUDIO_AU_CODE, unit, announcedInfoBytes))
                 return setError(answer, "The output did not take the samples");
             if (!output.sound()) return setError(QvStatus::failed, "%s", output.fault().c_str());
@@ -139,7 +153,7 @@ int RawAudioEnc::putUnit(RawOutput& output, const unsigned char* data, uint64_t 
 int RawAudioEnc::close() {
     if (getState() != qvStateOpen) return QvStatus::ok;
     setState(stateInitialised);
-    if (!(muxer_ == "rawmux")) return QvStatus::ok;
+    if (!target_.markedEnd) return QvStatus::ok;
     auto* out = outStream()->input();
     out->auxinfo(out, 0, QvAuxId::STREAM_END_CODE, nullptr, 0);
     if (outStream()->ioError() != 0)

@@ -7,6 +7,13 @@
 #include "core/encode/qvencoder.h"
 #include "core/engine/modules/qvmodule.h"
 
+// What differs by multiplexer.
+struct RawAudioTarget {
+    bool announcedUnits = false;  // each writePcm is announced; units that its ring can't hold go in pieces
+    bool markedEnd = false;       // close marks the end of the stream
+    bool lpcmHeader = false;      // six bytes that describe the format come before the first samples
+};
+
 // Samples go to the output as they lie in the buffer: interleaved, little-endian, (bits + 7) / 8 bytes a
 // value, 8 bits unsigned. With the multiplexers "rawmux" and "memmux" each writePcm is announced as an access
 // unit, in pieces of whole samples when the output can't hold it at once; with "rawmux" close marks the end
@@ -31,11 +38,10 @@ class RawAudioEnc : public QvAudioEncoder {
 
   private:
     int putHeader(class RawOutput& output);
-    bool announcesUnits() const;
     int putUnits(RawOutput& output, const unsigned char* data, uint64_t bytes);
     int putUnit(RawOutput& output, const unsigned char* data, uint64_t bytes);
 
     RawAudioSettings settings_;
     bool headerDue_ = false;
-    Any muxer_;  // name of the multiplexer, "N/A" when there is none
+    RawAudioTarget target_;  // of the multiplexer at open()
 };
