@@ -227,7 +227,7 @@ int RawMux::close() { return getState() == qvStateOpen ? finish(0) : QvStatus::o
 
 int RawMux::abort() { return getState() == qvStateOpen ? finish(1) : QvStatus::ok; }
 
-// Every file is finished, whatever happens to one of them; the first failure is told.
+// Every file is finished, whatever happens to one of them; the first failure is reported.
 int RawMux::finish(int abort) {
     std::string failure;
     for (const int type : {qvAudioStream, qvVideoStream})

@@ -81,6 +81,23 @@ TEST_F(Exchange, SettingsComeBackWithTheMultiplexer) {
     EXPECT_EQ(get(end_.muxer(), "splitVideo"), 1) << "for another preset, too";
 }
 
+TEST_F(Exchange, TypeAndTimingAreHandedOn) {
+    builder_.addDefault(qvVideoStream);
+    for (const auto& [param, targets] : {std::pair<const char*, Texts>("type", {"rawmux.type"}),
+                                         {"pal", {"rawmux.pal", "rawvenc.pal"}},
+                                         {"dropFrameTC", {"rawmux.dropFrameTC", "rawvenc.dropFrameTC"}}})
+        for (const auto& target : targets) {
+            outputs_.watched = target;
+            outputs_.calls.clear();
+            outputs_.params.clear();
+            exchange_.change("rawmux");
+            EXPECT_TRUE(outputs_.calls.empty()) << target << ": the old one knows none";
+            outputs_.params.set((std::string("rawmux.") + param).c_str(), 1);
+            exchange_.change("rawmux");
+            EXPECT_EQ(outputs_.calls.back(), target + "=1");
+        }
+}
+
 TEST_F(Exchange, TheEnginesOwnMultiplexersBringTheirSink) {
     for (const auto& [muxer, sink] : {std::pair("nullmux", "nullsink"), {"memmux", "memsink"}}) {
         ASSERT_EQ(exchange_.change(muxer), 0);

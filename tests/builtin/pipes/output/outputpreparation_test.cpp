@@ -29,10 +29,12 @@ TEST_F(Preparation, VideoGivesWayToTheTotalBitrateOfAvchd) {
         {1, 4e7, 1000, left, 1000},  {0, 4e7, 3e7, 4e7, 3e7},
     };
     for (const auto& [avchd, maximum, average, maximumAfter, averageAfter] : cases) {
+        LogCapture log;
         video.params = AnyDict("_isAVCHD", avchd, "maxVBitrate", maximum, "vBitrate", average);
         run();
         EXPECT_EQ(video.params.get("maxVBitrate"), Any(maximumAfter));
         EXPECT_EQ(video.params.get("vBitrate"), Any(averageAfter));
+        EXPECT_EQ(log.contains("larger than maximal allowed for AVCHD"), maximumAfter != maximum);
     }
 }
 
@@ -49,7 +51,7 @@ TEST_F(Preparation, TheFirstVideoEncodersRateGoesToAllOthers) {
     EXPECT_FALSE(audio.params.isSet("framerate"));
 }
 
-TEST_F(Preparation, AnEncoderForTransportStreamsIsToldOfManyPrograms) {
+TEST_F(Preparation, AacIsAdjustedForAMultiplexerOfManyPrograms) {
     struct Aac : FakeAudioEncoder {
         const char* name() const override { return "aacaenc"; }
     };

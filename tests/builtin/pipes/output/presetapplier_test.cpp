@@ -42,18 +42,29 @@ TEST_F(Applier, AUsersPresetGetsTheStreamsThatFit) {
 }
 
 TEST_F(Applier, ABuiltinPresetKeepsSubpicturesAndOnRequestFilters) {
-    outputs_.params = AnyDict("rawmux.maxStreams", AnyDict("vids", 1, "auds", 1, "subs", 1, "total", 3));
+    outputs_.params = AnyDict("rawmux.maxStreams", AnyDict("vids", 1, "auds", 1, "subs", 2, "total", 4));
     ASSERT_EQ(applier_.applyBuiltin(QvProfile::raw, false), 0);
     ASSERT_EQ(builder_.addDefault(qvSubpicStream), 0);
+    builder_.addDefault(qvSubpicStream);
     for (const bool keep : {true, false}) {
-        streams_.find(qvSubpicStream, 0)->filters().setFilter("cropper", AnyDict("name", "cropper"));
+        streams_.find(qvSubpicStream, 1)->filters().setFilter("cropper", AnyDict("name", "cropper"));
         ASSERT_EQ(applier_.applyBuiltin(QvProfile::raw, keep), 0);
-        ASSERT_EQ(streams_.count(qvSubpicStream), 1);
-        EXPECT_EQ(streams_.find(qvSubpicStream, 0)->filters().count(), keep ? 1 : 0);
+        ASSERT_EQ(streams_.count(qvSubpicStream), 2);
+        EXPECT_EQ(streams_.find(qvSubpicStream, 0)->filters().count(), 0);
+        EXPECT_EQ(streams_.find(qvSubpicStream, 1)->filters().count(), keep ? 1 : 0);
     }
     EXPECT_EQ(applier_.applyBuiltin(3, false), QvStatus::invalidStructure);
     EXPECT_STREQ(host_.lastFailure(), "Invalid preset #3");
-    EXPECT_EQ(streams_.size(), 3u);
+    EXPECT_EQ(streams_.size(), 4u);
+}
+
+TEST_F(Applier, TransportStreamsAdjustTheirEncoders) {
+    auto& module = *qv_registry()->module("rawmux");
+    module.setAttr("transportStream", 1);
+    outputs_.watched = "rawvenc.tsAdjust";
+    EXPECT_EQ(applier_.applyBuiltin(QvProfile::raw, false), 0);
+    EXPECT_EQ(outputs_.calls, Texts{"rawvenc.tsAdjust=1"});
+    module.setAttr("transportStream", Any());
 }
 
 }  // namespace

@@ -41,6 +41,29 @@ TEST_F(Place, TheFileNameReachesWhatComesLater) {
     EXPECT_EQ(static_cast<const QvCodec&>(*end_.sink()).getParam("filename"), "a.b");
 }
 
+// Looks at the stream that it writes to when it is detached.
+struct DetachedMuxer : FakeMuxer {
+    DetachedMuxer() : FakeMuxer("rawavimux") { refusal = 0; }
+    int setParam(const char*, const Any&) override { return refusal; }
+    int detachOutStream() override {
+        detached = outStream() != nullptr && outStream()->atachee() == this;
+        return FakeMuxer::detachOutStream();
+    }
+    bool detached = false;
+    int refusal;
+};
+
+TEST_F(Place, AMultiplexerLeavesTheOldSinkWhileItIsThere) {
+    auto made = std::make_unique<DetachedMuxer>();
+    auto& muxer = *made;
+    end_.put(std::move(made));
+    end_.attach();
+    end_.setSink("nullsink");
+    EXPECT_TRUE(muxer.detached);
+    muxer.refusal = -55;
+    EXPECT_EQ(end_.setFilename("a.b"), -55);
+}
+
 TEST_F(Place, AMultiplexerThatComesBackHasItsSettings) {
     const auto fresh = [&](const QvPreset& preset) {
         end_.drop();
@@ -62,6 +85,9 @@ TEST_F(Place, AMultiplexerThatComesBackHasItsSettings) {
     end_.handOver();
     EXPECT_TRUE(fresh(anyMuxer()));
     EXPECT_TRUE(fresh(custom())) << "what was set here goes first";
+    end_.muxer()->setParam("splitAudio", 0);
+    end_.handOver();
+    EXPECT_FALSE(fresh(anyMuxer())) << "the latest settings";
 }
 
 TEST_F(Place, RoomIsThatOfTheMultiplexer) {
