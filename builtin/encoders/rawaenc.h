@@ -3,8 +3,16 @@
 
 #include <cstdint>
 
+#include "builtin/encoders/rawaencsettings.h"
 #include "core/encode/qvencoder.h"
 #include "core/engine/modules/qvmodule.h"
+
+// What differs by multiplexer.
+struct RawAudioTarget {
+    bool announcedUnits = false;  // each writePcm is announced; units that its ring can't hold go in pieces
+    bool markedEnd = false;       // close marks the end of the stream
+    bool lpcmHeader = false;      // six bytes that describe the format come before the first samples
+};
 
 // Samples go to the output as they lie in the buffer: interleaved, little-endian, (bits + 7) / 8 bytes a
 // value, 8 bits unsigned. With the multiplexers "rawmux" and "memmux" each writePcm is announced as an access
@@ -29,19 +37,11 @@ class RawAudioEnc : public QvAudioEncoder {
     int writePcm(QvPcm* pcm, int samples = -1) override;
 
   private:
-    friend struct RawAudioParams;
-
     int putHeader(class RawOutput& output);
-    bool announcesUnits() const;
     int putUnits(RawOutput& output, const unsigned char* data, uint64_t bytes);
     int putUnit(RawOutput& output, const unsigned char* data, uint64_t bytes);
-    int bytesPerSample() const { return channels_ * ((bitsPerSample_ + 7) / 8); }
 
-    int samplerate_ = 48000;
-    int channels_ = 2;
-    int bitsPerSample_ = 16;
-    int profile_ = -1;
-    int type_ = 0;
+    RawAudioSettings settings_;
     bool headerDue_ = false;
-    Any muxer_;  // name of the multiplexer, "N/A" when there is none
+    RawAudioTarget target_;  // of the multiplexer at open()
 };

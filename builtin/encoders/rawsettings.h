@@ -31,11 +31,12 @@ int apply(Encoder& encoder, const Any& settings) {
     return settings.isDict() ? encoder.setParamDict(settings.asDict()) : QvStatus::invalidParam;
 }
 
-template <class Encoder>
-AnyDict stored(std::span<const QvParamRow<Encoder>> rows, const Encoder& encoder) {
-    AnyDict settings;
-    qvStoreParamRows(rows, encoder, settings);
-    return AnyDict("name", encoder.name(), "settingsDict", settings);
+// `module`: the encoder's name.
+template <class Settings>
+AnyDict stored(const char* module, std::span<const QvParamRow<Settings>> rows, const Settings& settings) {
+    AnyDict dict;
+    qvStoreParamRows(rows, settings, dict);
+    return AnyDict("name", module, "settingsDict", dict);
 }
 
 // The older form has the settings next to the name, or in "settings". The caller has checked the name;

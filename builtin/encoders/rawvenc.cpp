@@ -1,54 +1,136 @@
 #include "builtin/encoders/rawvenc.h"
 
-#include <algorithm>
 #include <climits>
-#include <cstring>
-#include <exception>
-#include <mutex>
+#include <cmath>
 
 #include "builtin/creators.h"
+#include "builtin/encoders/rawsettings.h"
 #include "builtin/encoders/rawvencformats.h"
-#include "builtin/shared/rawoutput.h"
-#include "core/arch/platform.h"
 #include "core/arch/qvassert.h"
-#include "core/arch/qvexception.h"
-#include "core/engine/log/qvlog.h"
-#include "core/engine/modules/qvregistry.h"
-#include "core/filter/qvfilter.h"
-#include "core/stream/auxinfoid.h"
-#include "core/stream/qvbufstrm.h"
+#include "core/engine/modules/params.h"
 
-namespace {
+struct RawVideoEnc::Params {
+    using Enc = RawVideoEnc;
+    using Access = QvParamAccess<Enc>;
 
-constexpr int queuedFrames = 3;
-constexpr unsigned announcedInfoBytes = 32;
+    // --- What is set
 
-// All rows of a plane, the part of one included that an odd height leaves at the end of the chroma.
-void copyPlane(QvFrame& to, const QvFrame& from, int plane) {
-    const int toStride = to.stride(plane);
-    const int fromStride = from.stride(plane);
-    const auto row = static_cast<size_t>(std::min(toStride, fromStride));
-    int rows = to.plane_bytes(plane) / toStride;
-    unsigned char* target = to.plane(plane);
-    const unsigned char* source = from.plane(plane);
-    for (; rows > 0; --rows, target += toStride, source += fromStride) std::memcpy(target, source, row);
-    std::memcpy(target, source, static_cast<size_t>(to.plane_bytes(plane) % toStride));
+    template <int (*change)(Enc&, int)>
+    static int setInt(Enc& enc, const Any& value) {
+        int number = 0;
+        if (!qvparam::convert(value, number)) return QvStatus::invalidParam;
+        return change(enc, number);
+    }
+    static int width(Enc& enc, int width) { return enc.remake(width, enc.height_, enc.type_); }
+    static int height(Enc& enc, int height) { return enc.remake(enc.width_, height, enc.type_); }
+    static int type(Enc& enc, int type) {
+        return enc.remake(enc.width_, enc.height_, static_cast<unsigned>(type));
+    }
+    static int interlaced(Enc& enc, int interlaced) {
+        enc.rate_.setInterlaced(interlaced);
+        return QvStatus::ok;
+    }
+    static int framerate(Enc& enc, const Any& value) {
+        if (value.isFramerate()) {
+            enc.rate_ = value.asFramerate();
+            return QvStatus::ok;
+        }
+        double rate = 0;
+        if (!qvparam::convert(value, rate) || !(rate > 0)) return QvStatus::invalidParam;
+        enc.rate_.setRate(rate);
+        return QvStatus::ok;
+    }
+    static int acceleration(Enc& enc, const Any& value) {
+        return qvparam::convert(value, enc.accelerated_) ? QvStatus::ok : QvStatus::invalidParam;
+    }
+    static int ignore(Enc&, const Any&) { return QvStatus::ok; }
+
+    // --- What is answered
+
+    static double bitrate(const Enc& enc) {
+        return std::trunc(enc.rate_.rate().ratio() * enc.frameBytes_ * 8.0);
+    }
+    static int bitrateInt(const Enc& enc) { return rawsettings::bitrateInt(bitrate(enc)); }
+    static Any single(double value) { return Any(static_cast<float>(value)); }
+
+    template <int number>
+    static void fixed(const Enc&, Any& value) {
+        value = number;
+    }
+    static void vBitrate(const Enc& enc, Any& value) { value = bitrate(enc); }
+    static void frameAspect(const Enc& enc, Any& value) {
+        value = single(static_cast<double>(enc.width_) / enc.height_);
+    }
+    static void sizeRange(const Enc&, Any& value) {
+        value = AnyDict("wmin", 32, "wmax", 4096, "hmin", 32, "hmax", 4096);
+    }
+
+    static std::span<const QvParamRow<Enc>> rows();
+};
+
+std::span<const QvParamRow<RawVideoEnc>> RawVideoEnc::Params::rows() {
+    using E = const Enc&;
+    static const QvParamRow<Enc> table[] = {
+        {.name = "settings",
+         .member = Access{rawsettings::apply<Enc>, nullptr},
+         .flags = qvParamWriteOnly,
+         .help = "several parameters at once",
+         .type = Any::Dict},
+        {"firstPass", {}, qvParamIgnored},
+        {"twoPass", {}, qvParamIgnored},
+        {"meta", {}, qvParamIgnored},
+        {"vbr", {}, qvParamIgnored},
+        {"pal", {}, qvParamIgnored},
+        {"topFirst", {}, qvParamIgnored},
+        {"accelerationType", {}, qvParamIgnored},
+        {.name = "vBitrate", .member = Access{ignore, vBitrate}, .help = "accepted, without effect"},
+        {.name = "maxVBitrate", .member = Access{ignore, vBitrate}, .help = "accepted, without effect"},
+        {.name = "minVBitrate", .member = Access{ignore, vBitrate}, .help = "accepted, without effect"},
+        {.name = "bitrate",
+         .member = Access{ignore, [](E e, Any& v) { v = QvBitrate(QvBitrate::cbr, bitrateInt(e)); }},
+         .help = "accepted, without effect"},
+        {.name = "chapters", .member = Access{ignore, fixed<0>}, .help = "accepted, without effect"},
+        {.name = "frameAspect", .member = Access{ignore, frameAspect}, .help = "accepted, without effect"},
+        {"width", Access{setInt<width>, [](E e, Any& v) { v = e.width_; }}, qvParamStored, 1, 65535, "",
+         "pixels"},
+        {"height", Access{setInt<height>, [](E e, Any& v) { v = e.height_; }}, qvParamStored, 1, 65535, "",
+         "pixels"},
+        {.name = "type",
+         .member = Access{setInt<type>, [](E e, Any& v) { v = static_cast<int>(e.type_); }},
+         .flags = qvParamStored,
+         .help = "FOURCC of the output"},
+        {.name = "framerate",
+         .member = Access{framerate, [](E e, Any& v) { v = e.rate_; }},
+         .flags = qvParamStored,
+         .help = "a frame rate, or frames/s"},
+        {.name = "profile", .member = &Enc::profile_, .flags = qvParamWriteOnly, .help = "a QvProfile"},
+        {.name = "getOut", .member = &Enc::getOut_, .help = "kept, without effect"},
+        {.name = "accelerationOn",
+         .member = Access{acceleration, fixed<0>},
+         .help = "1: writes on a thread of its own"},
+        {"interlaced", Access{setInt<interlaced>, nullptr}, qvParamWriteOnly, 0, 2, "", "",
+         "0 progressive, 1 top field first, 2 bottom field first", Any::Int32},
+        {"selectedFOURCC", Access{nullptr, [](E e, Any& v) { v = static_cast<int>(e.frameType()); }}},
+        {"allowedTypes", Access{nullptr, [](E e, Any& v) { v = rawvenc::allowedTypes(e.profile_); }}},
+        {"pixelAspect", Access{nullptr, [](E, Any& v) { v = 1.0; }}},
+        {"frameAspectEx", Access{nullptr, [](E, Any& v) { v = 0.0; }}},
+        {"_outFrameSize", Access{nullptr, [](E e, Any& v) { v = e.frameBytes_; }}},
+        {"dstBuffSize", Access{nullptr, [](E e, Any& v) { v = e.frameBytes_ + 10; }}},
+        {"bitrateRange", Access{nullptr, [](E e, Any& v) { v = rawsettings::bitrateRange(bitrateInt(e)); }}},
+        {"vBitrateRange", Access{nullptr, [](E e, Any& v) { v = AnyVector(bitrateInt(e), bitrateInt(e)); }}},
+        {"twoPassPossible", Access{nullptr, fixed<0>}},
+        {"previewPossible", Access{nullptr, fixed<1>}},
+        {"estimateSecKb", Access{nullptr, [](E e, Any& v) { v = single(bitrate(e) / 8000.0); }}},
+        {"aspectRange", Access{nullptr, [](E, Any& v) { v = AnyVector(0.0); }}},
+        {"palRange", Access{nullptr, [](E, Any& v) { v = AnyVector(0); }}},
+        {"sizeRange", Access{nullptr, sizeRange}},
+        {"framerateRange", Access{nullptr, [](E, Any& v) { v = rawvenc::framerates(); }}},
+        {"extension", Access{nullptr, [](E, Any& v) { v = "raw"; }}},
+        {"hasAcceleration", Access{nullptr, fixed<0>}},
+        {"pulldown", Access{nullptr, fixed<0>}},
+    };
+    return table;
 }
-
-// Into a frame with the default strides. Unlike a frame's own assignment this takes every row of I422.
-int copyPacked(QvFrame& to, const QvFrame& from) {
-    if (to.four_cc() != from.four_cc() || to.width() != from.width() || to.height() != from.height() ||
-        !to.inited())
-        if (const int result = to.init(from.four_cc(), from.width(), from.height())) return result;
-    if (to.total_bytes() == from.total_bytes())
-        std::memcpy(to.plane(), from.plane(), static_cast<size_t>(to.total_bytes()));
-    else
-        for (int plane = 0; plane < to.planes(); ++plane) copyPlane(to, from, plane);
-    to.copyMeta(from);
-    return QvStatus::ok;
-}
-
-}  // namespace
 
 RawVideoEnc::RawVideoEnc() = default;
 
@@ -81,6 +163,26 @@ int RawVideoEnc::remake(int width, int height, unsigned type) {
     return QvStatus::ok;
 }
 
+int RawVideoEnc::setParam(const char* name, const Any& value) {
+    QV_ASSERT_MSG(getState() != stateCreated, "Not inited");
+    if (!qvFindParamRow(Params::rows(), name)) return QvVideoEncoder::setParam(name, value);
+    _traceParam(name, value);
+    if (auto result = qvSetParamRow(Params::rows(), *this, name, value)) return *result;
+    return QvVideoEncoder::setParam(name, value);
+}
+
+void RawVideoEnc::getParam(const char* name, Any& value) const {
+    if (!qvGetParamRow(Params::rows(), *this, name, value)) QvVideoEncoder::getParam(name, value);
+}
+
+void RawVideoEnc::store(AnyDict& state) const { state = rawsettings::stored(name(), Params::rows(), *this); }
+
+int RawVideoEnc::restore(const AnyDict& state) {
+    if (state.get("name") != name()) return setError(QvStatus::failed, "restore - invalid name");
+    return rawsettings::restore(
+        *this, state, [this](const AnyDict& rows) { return _restoreRows(Params::rows(), *this, rows); });
+}
+
 int RawVideoEnc::attachOutStream(QvBufStream* stream) {
     QV_ASSERT_MSG(getState() != stateCreated, "not inited");
     return QvVideoEncoder::attachOutStream(stream);
@@ -90,15 +192,9 @@ int RawVideoEnc::open() {
     QV_ASSERT_MSG(getState() != stateCreated, "not initialized");
     if (getState() != stateInitialised) return setError(QvStatus::failed, "Not initialized");
     if (!outStream()) return setError(QvStatus::failed, "Output stream not attached");
-    failure_ = {};
     if (accelerated_) {
-        if (const int result = queue_.init(queuedFrames)) return setError(result, "Out of memory");
-        stop_ = discard_ = false;
-        worker_ = qv_platform().startThread([this] { work(); });
-        if (!worker_.joinable()) {
-            queue_.destroy();
-            return setError(QvStatus::failed, "Can not start the writing thread");
-        }
+        const auto started = worker_.start([this](const QvFrame& frame) { return writeOut(frame); });
+        if (started.status != QvStatus::ok) return report(started);
     }
     setState(qvStateOpen);
     return QvStatus::ok;
@@ -116,9 +212,9 @@ int RawVideoEnc::writeFrame(QvFrame* frame) {
         return setError(QvStatus::invalidArgument, "A frame of %dx%d %s does not fit the output of %dx%d",
                         frame->planes() > 0 ? frame->width(0) : 0, frame->planes() > 0 ? frame->height(0) : 0,
                         frame->planes() > 0 ? frame->str_four_cc() : "no format", width_, height_);
-    if (worker_.joinable()) return enqueue(*frame);
+    if (worker_.running()) return report(worker_.put(*frame, last_));
     last_ = nullptr;
-    if (const int result = copyPacked(picture_, *frame)) return setError(result, "Out of memory");
+    if (const int result = rawvenc::copyPacked(picture_, *frame)) return setError(result, "Out of memory");
     last_ = &picture_;
     // A block that an output without a known fault does not give is a broken contract.
     const auto outcome = writeOut(picture_);
@@ -129,107 +225,16 @@ int RawVideoEnc::writeFrame(QvFrame* frame) {
 
 QvFrame* RawVideoEnc::lastFrame() { return last_; }
 
-RawVideoEnc::Outcome RawVideoEnc::writeOut(const QvFrame& frame) {
-    if (type_ != QvFourcc::v210) return writePicture(frame, frame.total_bytes());
-    const QvFrame* picture = nullptr;
-    if (auto outcome = convert(frame, picture); outcome.status != 0) return outcome;
-    auto outcome = writePicture(*picture, frame.total_bytes());
-    converter_->next();
-    return outcome;
+RawVideoOutcome RawVideoEnc::writeOut(const QvFrame& frame) {
+    return writer_.write(frame, *outStream(), type_ == QvFourcc::v210 ? frameBytes_ : 0);
 }
 
-// An output that takes access units apart needs the bytes that it was given; for others the announced count
-// is that of the frame that came in.
-RawVideoEnc::Outcome RawVideoEnc::writePicture(const QvFrame& picture, int announced) {
-    RawOutput output(*outStream());
-    const int bytes = picture.total_bytes();
-    switch (output.put(picture.plane(0, false), static_cast<uint64_t>(bytes))) {
-        case RawPutResult::ok: break;
-        case RawPutResult::noBlock: return {QvStatus::failed, true, output.asked()};
-        case RawPutResult::failed: return {QvStatus::failed, false, 0, output.fault()};
-    }
-    output.unlock();
-    const int answer =
-        output.announce(QvAuxId::VIDEO_AU_CODE, static_cast<uint64_t>(output.cutsUnits() ? bytes : announced),
-                        announcedInfoBytes);
-    if (answer != 0) return {answer, false, 0, "The output did not take the frame"};
-    if (!output.sound()) return {QvStatus::failed, false, 0, output.fault()};
-    return {};
-}
-
-int RawVideoEnc::report(const Outcome& outcome) {
+int RawVideoEnc::report(const RawVideoOutcome& outcome) {
     if (outcome.status == 0) return QvStatus::ok;
     if (!outcome.noBlock) return setError(outcome.status, "%s", outcome.text.c_str());
     const auto asked = static_cast<int>(outcome.asked);
     setError(outcome.status, "Error in raw encoder, can not allocate buffer, size=%d", asked);
     return outcome.status;
-}
-
-RawVideoEnc::Outcome RawVideoEnc::convert(const QvFrame& frame, const QvFrame*& picture) {
-    if (!converter_)
-        if (auto outcome = openConverter(frame); outcome.status != 0) return outcome;
-    if (const int result = converter_->write(const_cast<QvFrame&>(frame)))
-        return {result, false, 0, "Can not convert the frame to v210"};
-    if (const int result = converter_->process())
-        return {result, false, 0, "Can not convert the frame to v210"};
-    picture = converter_->frame();
-    if (!picture || picture->four_cc() != QvFourcc::v210 || picture->total_bytes() != frameBytes_)
-        return {QvStatus::failed, false, 0, "Can not convert the frame to v210"};
-    return {};
-}
-
-RawVideoEnc::Outcome RawVideoEnc::openConverter(const QvFrame& frame) {
-    auto* codec = static_cast<QvVideoFilter*>(qv_registry()->newCodec("colorconv"));
-    if (!codec) return {QvStatus::failed, false, 0, "There is no colour converter for v210"};
-    std::unique_ptr<QvVideoFilter> made(codec);
-    made->setParam("outWidth", frame.width(0));
-    made->setParam("outHeight", frame.height(0));
-    made->setParam("FOURCC", static_cast<int>(QvFourcc::v210));
-    if (made->open() != 0) return {QvStatus::failed, false, 0, "Invalid input four cc given"};
-    converter_ = std::move(made);
-    return {};
-}
-
-int RawVideoEnc::enqueue(const QvFrame& frame) {
-    std::unique_lock lock(queue_);
-    slotFree_.wait(lock, [this] { return queue_.nrEmpty() > 0 || failure_.status != 0; });
-    if (failure_.status != 0) return report(failure_);
-    QvFrame* slot = queue_.emptyBuffer();  // stays at the head: the worker only appends
-    lock.unlock();
-    const int copied = copyPacked(*slot, frame);
-    lock.lock();
-    if (copied != QvStatus::ok) return setError(copied, "Out of memory");
-    // The last to be taken for another picture: all slots that are empty by then have been so for longer.
-    last_ = slot;
-    queue_.moveToFull();
-    workReady_.notify_one();
-    return QvStatus::ok;
-}
-
-void RawVideoEnc::work() {
-    std::unique_lock lock(queue_);
-    while (failure_.status == 0) {
-        workReady_.wait(lock, [this] { return stop_ || queue_.nrFull() > 0; });
-        if (queue_.nrFull() == 0 || (stop_ && discard_)) break;
-        const QvFrame& frame = *queue_.fullBuffer();
-        lock.unlock();
-        auto outcome = writeQueued(frame);
-        lock.lock();
-        failure_ = std::move(outcome);
-        queue_.moveToEmpty();
-        slotFree_.notify_one();
-    }
-    slotFree_.notify_all();
-}
-
-RawVideoEnc::Outcome RawVideoEnc::writeQueued(const QvFrame& frame) noexcept {
-    try {
-        return writeOut(frame);
-    } catch (const QvException& failure) {
-        return {QvStatus::failed, false, 0, failure.what()};
-    } catch (const std::exception& failure) {
-        return {QvStatus::failed, false, 0, failure.what()};
-    }
 }
 
 int RawVideoEnc::close() { return getState() == qvStateOpen ? finish(false) : QvStatus::ok; }
@@ -238,19 +243,12 @@ int RawVideoEnc::abort() { return getState() == qvStateOpen ? finish(true) : QvS
 
 int RawVideoEnc::finish(bool discard) {
     int result = QvStatus::ok;
-    if (worker_.joinable()) {
-        {
-            std::lock_guard lock(queue_);
-            stop_ = true;
-            discard_ = discard;
-            workReady_.notify_one();
-        }
-        worker_.join();
+    if (worker_.running()) {
+        const auto outcome = worker_.stop(discard);
         last_ = nullptr;
-        queue_.destroy();
-        result = report(failure_);
+        result = report(outcome);
     }
-    converter_.reset();
+    writer_.reset();
     picture_.destroy();
     last_ = nullptr;
     setState(stateInitialised);

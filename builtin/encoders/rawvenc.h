@@ -1,18 +1,12 @@
 // RawVideoEnc: writes frames as they are. Module "rawvenc".
 #pragma once
 
-#include <condition_variable>
-#include <memory>
-#include <string>
-#include <thread>
-
+#include "builtin/encoders/rawvencworker.h"
+#include "builtin/encoders/rawvencwriter.h"
 #include "core/encode/qvencoder.h"
 #include "core/engine/modules/qvmodule.h"
 #include "core/measure/qvgeometry.h"
-#include "core/media/frameque.h"
 #include "core/media/qvbuffer.h"
-
-class QvVideoFilter;
 
 // Each frame goes to the output as the planes of its type, one after the other, with the default strides,
 // and is announced as one access unit. Type v210 takes Y216 frames and converts them.
@@ -43,29 +37,13 @@ class RawVideoEnc : public QvVideoEncoder {
     QvFrame* lastFrame() override;
 
   private:
-    friend struct RawVideoParams;
-
-    // What became of one frame. Made on the worker's thread too, so it is reported apart.
-    struct Outcome {
-        int status = 0;
-        bool noBlock = false;
-        unsigned asked = 0;
-        std::string text{};
-    };
+    struct Params;  // the rows
 
     int remake(int width, int height, unsigned type);
     unsigned frameType() const;
     bool accepts(const QvFrame& frame) const;
-
-    Outcome writeOut(const QvFrame& frame);
-    Outcome writePicture(const QvFrame& picture, int announced);
-    int report(const Outcome& outcome);
-    Outcome convert(const QvFrame& frame, const QvFrame*& picture);
-    Outcome openConverter(const QvFrame& frame);
-
-    int enqueue(const QvFrame& frame);
-    void work();
-    Outcome writeQueued(const QvFrame& frame) noexcept;
+    RawVideoOutcome writeOut(const QvFrame& frame);
+    int report(const RawVideoOutcome& outcome);
     int finish(bool discard);
 
     int width_ = 0;
@@ -78,14 +56,6 @@ class RawVideoEnc : public QvVideoEncoder {
     QvFrame* last_ = nullptr;
     bool getOut_ = false;
     bool accelerated_ = false;
-    std::unique_ptr<QvVideoFilter> converter_;
-
-    // Shared with the worker, under the queue's lock.
-    QvFrameQue queue_;
-    std::condition_variable_any workReady_;
-    std::condition_variable_any slotFree_;
-    bool stop_ = false;
-    bool discard_ = false;
-    Outcome failure_;
-    std::thread worker_;
+    RawVideoWriter writer_;
+    RawVideoWorker worker_;
 };

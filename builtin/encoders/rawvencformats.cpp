@@ -1,5 +1,9 @@
 #include "builtin/encoders/rawvencformats.h"
 
+#include <algorithm>
+#include <cstring>
+
+#include "core/engine/status.h"
 #include "core/measure/fourcc.h"
 #include "core/measure/qvgeometry.h"
 
@@ -39,7 +43,32 @@ constexpr Rate rates[] = {
     {50.0, 0},   {59.94, 0}, {60.0, 0}, {100.0, 0}, {119.88, 0}, {120.0, 0},
 };
 
+// All rows of a plane, the part of one included that an odd height leaves at the end of the chroma.
+void copyPlane(QvFrame& to, const QvFrame& from, int plane) {
+    const int toStride = to.stride(plane);
+    const int fromStride = from.stride(plane);
+    const auto row = static_cast<size_t>(std::min(toStride, fromStride));
+    int rows = to.plane_bytes(plane) / toStride;
+    unsigned char* target = to.plane(plane);
+    const unsigned char* source = from.plane(plane);
+    for (; rows > 0; --rows, target += toStride, source += fromStride) std::memcpy(target, source, row);
+    std::memcpy(target, source, static_cast<size_t>(to.plane_bytes(plane) % toStride));
+}
+
 }  // namespace
+
+// Unlike a frame's own assignment this takes every row of I422.
+int copyPacked(QvFrame& to, const QvFrame& from) {
+    if (to.four_cc() != from.four_cc() || to.width() != from.width() || to.height() != from.height() ||
+        !to.inited())
+        if (const int result = to.init(from.four_cc(), from.width(), from.height())) return result;
+    if (to.total_bytes() == from.total_bytes())
+        std::memcpy(to.plane(), from.plane(), static_cast<size_t>(to.total_bytes()));
+    else
+        for (int plane = 0; plane < to.planes(); ++plane) copyPlane(to, from, plane);
+    to.copyMeta(from);
+    return QvStatus::ok;
+}
 
 int v210Bytes(int width, int height) { return 128 * ((width + 47) / 48) * height; }
 

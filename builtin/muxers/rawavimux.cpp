@@ -5,6 +5,8 @@
 #include "builtin/muxers/streamcodec.h"
 #include "core/arch/qvassert.h"
 #include "core/arch/undo_p.h"
+#include "core/engine/modules/params.h"
+#include "core/engine/modules/qvmodule.h"
 #include "core/measure/fourcc.h"
 #include "core/measure/qvgeometry.h"
 #include "core/stream/iofailure.h"
@@ -16,6 +18,32 @@ constexpr int mostChannels = 32;
 
 // Speakers of the usual layouts; 0 leaves them open.
 constexpr unsigned speakers[] = {0, 0x4, 0x3, 0, 0, 0, 0x3F, 0, 0x63F};
+
+using Settings = RawAviMux::Settings;
+using Answer = QvParamAccess<RawAviMux>;
+
+constexpr QvParamRow<Settings> settingRows[] = {
+    {"riffBytes", &Settings::riffBytes, qvParamStored, 1024, 1 << 30, "", "bytes",
+     "of each RIFF part of the file"},
+    {"segments", &Settings::segments, qvParamStored, 1, 65536, "", "", "RIFF parts at most"},
+    {"framerate", {}, qvParamIgnored},
+};
+static_assert(qvParamTableOk<Settings>(settingRows));
+
+AnyDict limits() {
+    return AnyDict("vids", mostStreams, "auds", mostStreams, "subs", 0, "total", mostStreams);
+}
+
+constexpr QvParamRow<RawAviMux> answerRows[] = {
+    {"estimateSecKb", Answer{nullptr, [](const RawAviMux& m, Any& v) { v = qvEstimateSecKb(m); }}},
+    {"videoCodecs",
+     Answer{nullptr, [](const RawAviMux& m, Any& v) { v = qvMuxerCodecs(m, QvModuleType::videoEncoder); }}},
+    {"audioCodecs",
+     Answer{nullptr, [](const RawAviMux& m, Any& v) { v = qvMuxerCodecs(m, QvModuleType::audioEncoder); }}},
+    {"extension", Answer{nullptr, [](const RawAviMux&, Any& v) { v = "avi"; }}},
+    {"maxStreams", Answer{nullptr, [](const RawAviMux&, Any& v) { v = limits(); }}},
+};
+static_assert(qvParamTableOk<RawAviMux>(answerRows));
 
 std::vector<unsigned char> pictureFormat(const AviPicture& picture) {
     AviBytes format;
@@ -40,6 +68,29 @@ std::vector<unsigned char> soundFormat(int samplerate, int channels, int bits) {
 
 RawAviMux::~RawAviMux() { end(); }
 
+int RawAviMux::setParam(const char* name, const Any& value) {
+    QV_ASSERT_MSG(getState() != qvStateOpen, "[rawavimux] Invalid state");
+    _traceParam(name, value);
+    if (auto result = qvSetParamRow<Settings>(settingRows, settings_, name, value)) return *result;
+    return BaseMuxer::setParam(name, value);
+}
+
+void RawAviMux::getParam(const char* name, Any& value) const {
+    if (qvGetParamRow<Settings>(settingRows, settings_, name, value)) return;
+    if (!qvGetParamRow<RawAviMux>(answerRows, *this, name, value)) BaseMuxer::getParam(name, value);
+}
+
+void RawAviMux::store(AnyDict& state) const {
+    state.clear();
+    state.set("name", name());
+    qvStoreParamRows<Settings>(settingRows, settings_, state);
+}
+
+int RawAviMux::restore(const AnyDict& state) {
+    if (!(state.get("name") == name())) return setError(QvStatus::failed, "restore - invalid name");
+    return _restoreRows<Settings>(settingRows, settings_, state);
+}
+
 QvBufStream* RawAviMux::addStream(int type, const AnyDict& params) {
     QV_ASSERT_MSG(type == qvVideoStream || type == qvAudioStream, "Invalid stream type");
     if (nrStreams(0) >= mostStreams) return nullptr;
@@ -58,7 +109,8 @@ int RawAviMux::open() {
         for (int nr = 0; nr < nrStreams(type); ++nr)
             if (const int result = describe(type, nr, sources)) return result;
     Undo ending([this] { end(); });
-    if (!interleaver_.open(*outStream(), std::move(sources), {riffBytes_, segments_})) return fail();
+    if (!interleaver_.open(*outStream(), std::move(sources), {settings_.riffBytes, settings_.segments}))
+        return fail();
     size_t track = 0;
     for (const int type : {qvVideoStream, qvAudioStream})
         for (int nr = 0; nr < nrStreams(type); ++nr) {

@@ -18,6 +18,11 @@
 //   "segments"    1 to 65536, 2048      room for the places of their indexes; a file that needs more fails
 class RawAviMux : public BaseMuxer {
   public:
+    struct Settings {
+        int riffBytes = static_cast<int>(AviFile::Limits().segmentBytes);
+        int segments = AviFile::Limits().segments;
+    };
+
     RawAviMux() = default;
     ~RawAviMux() override;
 
@@ -36,15 +41,12 @@ class RawAviMux : public BaseMuxer {
     int abort() override;
 
   private:
-    friend struct RawAviMuxParams;
-
     int describe(int type, int nr, std::vector<AviInterleaver::Source>& sources);
     int describeVideo(const QvCodec& encoder, AviInterleaver::Source& source);
     int describeAudio(const QvCodec& encoder, AviInterleaver::Source& source);
     int fail();
     void end();
 
-    int riffBytes_ = static_cast<int>(AviFile::Limits().segmentBytes);
-    int segments_ = AviFile::Limits().segments;
+    Settings settings_;
     AviInterleaver interleaver_;
 };

@@ -11,19 +11,101 @@
 #include "core/arch/qvassert.h"
 #include "core/arch/undo_p.h"
 #include "core/engine/files/qvfileutil.h"
+#include "core/engine/modules/params.h"
+#include "core/engine/modules/qvmodule.h"
 #include "core/measure/fourcc.h"
+#include "core/measure/qvgeometry.h"
 #include "core/split/qvbufstreamsplit.h"
 #include "core/stream/file/qvfilebufstream.h"
 
 namespace {
 
 constexpr char nameMissing[] = "[rawmux] Output filename not set";
+constexpr int mostStreams = 99;  // their numbers have two digits
+
+using Settings = RawMux::Settings;
+using Answer = QvParamAccess<RawMux>;
+
+constexpr QvParamRow<Settings> settingRows[] = {
+    {.name = "rawAsPng",
+     .member = &Settings::rawAsPng,
+     .flags = qvParamStored,
+     .help = "with splitVideo: frames become PNG files"},
+    {.name = "splitVideo",
+     .member = &Settings::splitVideo,
+     .flags = qvParamStored,
+     .help = "a file for each frame"},
+    {.name = "splitAudio",
+     .member = &Settings::splitAudio,
+     .flags = qvParamStored,
+     .help = "a file for each channel"},
+    {.name = "filename",
+     .member = &Settings::filename,
+     .help = "of the outputs, without their extensions",
+     .type = Any::String},
+    {.name = "exactName", .member = &Settings::exactName, .help = "the one stream goes to filename as it is"},
+    {"type", {}, qvParamIgnored},
+    {"_totalFrames", &Settings::totalFrames},
+};
+static_assert(qvParamTableOk<Settings>(settingRows));
+
+AnyDict limits() {
+    return AnyDict("vids", mostStreams, "auds", mostStreams, "subs", 0, "total", mostStreams);
+}
+
+constexpr QvParamRow<RawMux> answerRows[] = {
+    {"rawMux", Answer{nullptr, [](const RawMux&, Any& v) { v = 1; }}},
+    {"estimateSecKb", Answer{nullptr, [](const RawMux& m, Any& v) { v = qvEstimateSecKb(m); }}},
+    {"videoCodecs",
+     Answer{nullptr, [](const RawMux& m, Any& v) { v = qvMuxerCodecs(m, QvModuleType::videoEncoder); }}},
+    {"audioCodecs",
+     Answer{nullptr, [](const RawMux& m, Any& v) { v = qvMuxerCodecs(m, QvModuleType::audioEncoder); }}},
+    {"extension", Answer{nullptr, [](const RawMux& m, Any& v) { v = m.extension(); }}},
+    {"filenames", Answer{nullptr, [](const RawMux& m, Any& v) { v = m.filenames(); }}},
+    {"filesWritten", Answer{nullptr, [](const RawMux& m, Any& v) { v = m.filesWritten(); }}},
+    {"maxStreams", Answer{nullptr, [](const RawMux&, Any& v) { v = limits(); }}},
+};
+static_assert(qvParamTableOk<RawMux>(answerRows));
 
 }  // namespace
 
 RawMux::RawMux() = default;
 
 RawMux::~RawMux() { finish(1); }
+
+int RawMux::setParam(const char* name, const Any& value) {
+    QV_ASSERT_MSG(getState() != qvStateOpen, "[RawMux] Invalid state");
+    if (auto result = _setRow<Settings>(settingRows, settings_, name, value)) return *result;
+    return OwnFilesMuxer::setParam(name, value);
+}
+
+void RawMux::getParam(const char* name, Any& value) const {
+    if (qvGetParamRow<Settings>(settingRows, settings_, name, value)) return;
+    if (!qvGetParamRow<RawMux>(answerRows, *this, name, value)) OwnFilesMuxer::getParam(name, value);
+}
+
+void RawMux::store(AnyDict& state) const {
+    state.clear();
+    state.set("name", name());
+    qvStoreParamRows<Settings>(settingRows, settings_, state);
+}
+
+int RawMux::restore(const AnyDict& state) {
+    if (!(state.get("name") == name())) return setError(QvStatus::failed, "restore - invalid name");
+    return _restoreRows<Settings>(settingRows, settings_, state);
+}
+
+Any RawMux::extension() const {
+    if (nrStreams(qvVideoStream) > 0) return qvStreamExtension(*stream(qvVideoStream, 0), "vid");
+    return nrStreams(qvAudioStream) > 0 ? "aud" : "vid";
+}
+
+AnyVector RawMux::filenames() const {
+    AnyVector names;
+    for (const int type : {qvVideoStream, qvAudioStream})
+        for (int nr = 0; nr < nrStreams(type); ++nr) names.append(outputName(type, nr));
+    return names;
+}
 
 QvBufStream* RawMux::addStream(int type, const AnyDict& params) {
     std::unique_ptr<QvBufStream> made;
@@ -40,10 +122,10 @@ QvBufStream* RawMux::addStream(int type, const AnyDict& params) {
 bool RawMux::hasSeveral() const { return nrStreams(qvVideoStream) > 1 || nrStreams(qvAudioStream) > 1; }
 
 Any RawMux::outputName(int type, int nr) const {
-    QV_ASSERT_MSG(filename_.isText(), nameMissing);
-    if (exactName_) return filename_;
+    QV_ASSERT_MSG(settings_.filename.isText(), nameMissing);
+    if (settings_.exactName) return settings_.filename;
     auto& output = *stream(type, nr);
-    Any name = QvFile::stripExt(filename_);
+    Any name = QvFile::stripExt(settings_.filename);
     if (hasSeveral()) name = Any::strcat(name, Any::sprintf("#%02d", nr));
     return Any::strcat(Any::strcat(name, "."), qvStreamExtension(output, ""));
 }
@@ -52,7 +134,7 @@ bool RawMux::makesSeveral() const {
     int enabled = 0;
     for (const int type : {qvVideoStream, qvAudioStream})
         for (int nr = 0; nr < nrStreams(type); ++nr) enabled += stream(type, nr)->enabled() ? 1 : 0;
-    return enabled > 1 || splitVideo_ || splitAudio_;
+    return enabled > 1 || settings_.splitVideo || settings_.splitAudio;
 }
 
 // Streams whose names agree would write over each other.
@@ -70,11 +152,11 @@ int RawMux::checkNames() const {
 
 int RawMux::open() {
     QV_ASSERT_MSG(getState() == stateInitialised, "[rawmux] Invalid state");
-    QV_ASSERT_MSG(filename_.isText(), nameMissing);
+    QV_ASSERT_MSG(settings_.filename.isText(), nameMissing);
     QV_ASSERT_MSG(anyEnabled(), "No enabled streams - use QvTranscoder::link()");
     QV_ASSERT_MSG(outStream(), "Output not set");
     outputs_.clear();
-    if (exactName_ && makesSeveral())
+    if (settings_.exactName && makesSeveral())
         return setError(QvStatus::failed, "One output of an exact name takes one stream in one piece");
     if (checkNames() != 0)
         return setError(QvStatus::failed,
@@ -102,15 +184,15 @@ int RawMux::openAudio(int nr) {
     const auto* encoder = output.atachee();
     const bool pcm = qvIsCodec(encoder, "rawaenc");
     output.setParam("isPcm", pcm ? 1 : 0);
-    output.setParam("split", pcm && splitAudio_ ? 1 : 0);
+    output.setParam("split", pcm && settings_.splitAudio ? 1 : 0);
     if (pcm)
         for (const char* name : {"samplerate", "channels", "bitsPerSample"})
             output.setParam(name, encoder->getParam(name));
     output.setParam(rawWriteThrough, pcm ? 0 : 1);
     const int channels = encoder ? qvIntParam(*encoder, "channels", 1) : 1;
-    outputs_.push_back(std::make_unique<Output>(output, outputName(qvAudioStream, nr),
-                                                pcm && splitAudio_ ? Output::channelFiles : Output::oneFile,
-                                                channels));
+    outputs_.push_back(std::make_unique<RawMuxOutput>(
+        output, outputName(qvAudioStream, nr),
+        pcm && settings_.splitAudio ? RawMuxOutput::channelFiles : RawMuxOutput::oneFile, channels));
     return openStream(qvAudioStream, nr, "Unable to open output audio file %s");
 }
 
@@ -118,11 +200,12 @@ int RawMux::openVideo(int nr) {
     auto& output = *stream(qvVideoStream, nr);
     const auto* encoder = output.atachee();
     const bool raw = qvIsCodec(encoder, "rawvenc");
-    const bool split = splitVideo_ && (raw || qvIsCodec(encoder, "mj2kvenc"));
-    const bool png = split && rawAsPng_ && raw;
-    const int digits = totalFrames_ >= 1
-                           ? static_cast<int>(std::ceil(std::log10(static_cast<double>(totalFrames_))) + 0.1)
-                           : 0;
+    const bool split = settings_.splitVideo && (raw || qvIsCodec(encoder, "mj2kvenc"));
+    const bool png = split && settings_.rawAsPng && raw;
+    const int digits =
+        settings_.totalFrames >= 1
+            ? static_cast<int>(std::ceil(std::log10(static_cast<double>(settings_.totalFrames))) + 0.1)
+            : 0;
     output.setParam("split", split ? 1 : 0);
     output.setParam("nrDigits", digits);
     const auto size = output.getParam("size");
@@ -135,8 +218,9 @@ int RawMux::openVideo(int nr) {
         output.setParam("FOURCC", encoder->getParam("type"));
     }
     output.setParam(rawWriteThrough, split ? 0 : 1);
-    outputs_.push_back(std::make_unique<Output>(output, outputName(qvVideoStream, nr),
-                                                split ? Output::pictureFiles : Output::oneFile, digits, png));
+    outputs_.push_back(std::make_unique<RawMuxOutput>(
+        output, outputName(qvVideoStream, nr), split ? RawMuxOutput::pictureFiles : RawMuxOutput::oneFile,
+        digits, png));
     return openStream(qvVideoStream, nr, "Unable to open output video file %s");
 }
 
@@ -155,7 +239,7 @@ int RawMux::close() { return getState() == qvStateOpen ? finish(0) : QvStatus::o
 
 int RawMux::abort() { return getState() == qvStateOpen ? finish(1) : QvStatus::ok; }
 
-// Every file is finished, whatever happens to one of them; the first failure is told.
+// Every file is finished, whatever happens to one of them; the first failure is reported.
 int RawMux::finish(int abort) {
     const QvBufStream* failed = nullptr;
     for (const int type : {qvAudioStream, qvVideoStream})

@@ -6,6 +6,8 @@
 
 #include "builtin/muxers/ownfilesmuxer.h"
 
+struct RawMuxOutput;
+
 // Names: the output's name without its extension, "#00" and so on (the number within the type) when there are
 // several streams of any type, and the extension of the encoder. "a.mpg" with one video and two audio streams
 // gives a#00.raw, a#00.wav and a#01.wav.
@@ -23,6 +25,15 @@
 //                            After close with status 0 they are complete; otherwise they are what is left.
 class RawMux : public OwnFilesMuxer {
   public:
+    struct Settings {
+        Any filename;
+        int totalFrames = 0;
+        bool splitVideo = false;
+        bool splitAudio = false;
+        bool rawAsPng = false;
+        bool exactName = false;
+    };
+
     RawMux();
     ~RawMux() override;
 
@@ -40,10 +51,12 @@ class RawMux : public OwnFilesMuxer {
     int close() override;
     int abort() override;
 
-  private:
-    friend struct RawMuxParams;
-    struct Output;
+    // What the read-only parameters of these names answer.
+    Any extension() const;
+    AnyVector filenames() const;
+    AnyVector filesWritten() const;
 
+  private:
     bool hasSeveral() const;
     Any outputName(int type, int nr) const;
     bool makesSeveral() const;
@@ -53,13 +66,7 @@ class RawMux : public OwnFilesMuxer {
     int openVideo(int nr);
     int openStream(int type, int nr, const char* failure);
     int finish(int abort);
-    AnyVector filesWritten() const;
 
-    Any filename_;
-    int totalFrames_ = 0;
-    bool splitVideo_ = false;
-    bool splitAudio_ = false;
-    bool rawAsPng_ = false;
-    bool exactName_ = false;
-    std::vector<std::unique_ptr<Output>> outputs_;  // of the last run
+    Settings settings_;
+    std::vector<std::unique_ptr<RawMuxOutput>> outputs_;  // of the last run
 };

@@ -13,13 +13,13 @@ void appendFile(AnyVector& files, const Any& name) {
 }  // namespace
 
 // "dir/base" + "#7" + ".ext", as the stream names them.
-Any RawMux::Output::numbered(int digitCount, int number, const Any& extension) const {
+Any RawMuxOutput::numbered(int digitCount, int number, const Any& extension) const {
     const Any digits = Any::sprintf("#%0*d.", std::max(digitCount, 1), number);
     const Any file = Any::strcat(Any::strcat(QvFile::getBasename(name), digits), extension);
     return QvFile::joinPath(QvFile::getPath(name), file);
 }
 
-void RawMux::Output::appendFiles(AnyVector& files) const {
+void RawMuxOutput::appendFiles(AnyVector& files) const {
     const Any extension = QvFile::getExt(name, false);
     switch (kind) {
         case oneFile:

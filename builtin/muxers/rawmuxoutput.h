@@ -1,22 +1,22 @@
 // The files that one stream of the elementary stream export makes.
 #pragma once
 
-#include "builtin/muxers/rawmux.h"
 #include "core/stream/auxinfoid.h"
 #include "core/stream/qvbufstrm.h"
+#include "core/value/anycontainer.h"
 
 // Counts the pictures of a stream that makes a file of each, by listening to their announcements.
-struct RawMux::Output final : QvAuxInfoObserver {
+struct RawMuxOutput final : QvAuxInfoObserver {
     enum Kind { oneFile, pictureFiles, channelFiles };
 
     // `count`: digits of the picture numbers, or channels. `stream` must live until release().
-    Output(QvBufStream& output, const Any& fullName, Kind filesAre, int countIs, bool isPng = false)
+    RawMuxOutput(QvBufStream& output, const Any& fullName, Kind filesAre, int countIs, bool isPng = false)
         : name(fullName), kind(filesAre), count(countIs), png(isPng), stream(&output) {
         if (kind == pictureFiles) stream->registerObserver(this);
     }
-    ~Output() override { release(); }
-    Output(const Output&) = delete;
-    Output& operator=(const Output&) = delete;
+    ~RawMuxOutput() override { release(); }
+    RawMuxOutput(const RawMuxOutput&) = delete;
+    RawMuxOutput& operator=(const RawMuxOutput&) = delete;
 
     void release() {
         if (stream && kind == pictureFiles) stream->unregisterObserver(this);

@@ -1,5 +1,6 @@
 #include "builtin/sinks/qvfilebuiltins.h"
 
+#include <cstring>
 #include <mutex>
 
 #include "builtin/creators.h"
@@ -11,26 +12,17 @@
 #include "core/engine/modules/params.h"
 #include "core/measure/qvgeometry.h"
 
-struct FileSinkParams {
-    static constexpr int largestBuffer = 1 << 30;
-
-    static std::span<const QvParamRow<FileSink>> rows() {
-        static const QvParamRow<FileSink> table[] = {
-            {.name = "filename", .member = &FileSink::filename_, .help = "the output", .type = Any::String},
-            {"bufsize", &FileSink::bufsize_, qvParamPlain, 1, largestBuffer, "", "bytes"},
-            {"filesWritten", QvParamAccess<FileSink>{nullptr, filesWritten}},
-        };
-        return table;
-    }
-
-    static void filesWritten(const FileSink& sink, Any& value) {
-        AnyVector files;
-        if (sink.written_.isText()) files.append(sink.written_);
-        value = files;
-    }
-};
-
 namespace {
+
+constexpr int largestBuffer = 1 << 30;
+
+using Settings = FileSink::Settings;
+
+constexpr QvParamRow<Settings> rows[] = {
+    {.name = "filename", .member = &Settings::filename, .help = "the output", .type = Any::String},
+    {"bufsize", &Settings::bufsize, qvParamPlain, 1, largestBuffer, "", "bytes"},
+};
+static_assert(qvParamTableOk<Settings>(rows));
 
 // For messages only.
 std::string shown(const Any& name) {
@@ -49,12 +41,16 @@ int FileSink::init() { return QvSink::init(); }
 int FileSink::setParam(const char* name, const Any& value) {
     _traceParam(name, value);
     if (getState() == stateCreated) return setError(QvStatus::failed, "not inited");
-    if (auto result = qvSetParamRow(FileSinkParams::rows(), *this, name, value)) return *result;
+    if (auto result = qvSetParamRow<Settings>(rows, settings_, name, value)) return *result;
     return QvSink::setParam(name, value);
 }
 
 void FileSink::getParam(const char* name, Any& value) const {
-    if (!qvGetParamRow(FileSinkParams::rows(), *this, name, value)) QvSink::getParam(name, value);
+    if (qvGetParamRow<Settings>(rows, settings_, name, value)) return;
+    if (!name || std::strcmp(name, "filesWritten") != 0) return QvSink::getParam(name, value);
+    AnyVector files;
+    if (written_.isText()) files.append(written_);
+    value = files;
 }
 
 int FileSink::open() {
@@ -66,15 +62,15 @@ int FileSink::open() {
     doNothing_ = nothing.isInt32() && nothing.asInt32() != 0;
     Undo closing([this] { stream_.destroy(1); });
     if (!doNothing_) {
-        if (!filename_.isText() || filename_.isFalse())
+        if (!settings_.filename.isText() || settings_.filename.isFalse())
             return setError(QvStatus::failed, "Failed to open output file: no name is set");
-        stream_.setParam("size", bufsize_);
-        stream_.setParam("outfilename", filename_);
+        stream_.setParam("size", settings_.bufsize);
+        stream_.setParam("outfilename", settings_.filename);
         if (stream_.init() != 0) {
-            qv_dbg()->error("Can not create file %s", shown(filename_).c_str());
+            qv_dbg()->error("Can not create file %s", shown(settings_.filename).c_str());
             return setError(QvStatus::failed, "Failed to open output file");
         }
-        written_ = filename_;
+        written_ = settings_.filename;
     }
     closing.dismiss();
     setState(qvStateOpen);
@@ -85,14 +81,14 @@ int FileSink::open() {
 int FileSink::writeOut() {
     std::lock_guard lock(stream_);
     auto* out = stream_.input();
-    const auto size = static_cast<unsigned>(bufsize_);
+    const auto size = static_cast<unsigned>(settings_.bufsize);
     if (out->usable(out) < size && !out->request(out, size)) return QvStatus::failed;
     out->auxinfo(out, 0, QvAuxId::FLUSH_BUFFER, nullptr, 0);
     return stream_.ioError() == 0 ? QvStatus::ok : QvStatus::failed;
 }
 
 int FileSink::failFlush() {
-    qv_dbg()->error("FileSink, Error, can not flush %s", shown(filename_).c_str());
+    qv_dbg()->error("FileSink, Error, can not flush %s", shown(settings_.filename).c_str());
     const auto reason = stream_.ioErrorText();
     return setError(QvStatus::failed, "%s",
                     reason.empty() ? "Can not write to the output file" : reason.c_str());

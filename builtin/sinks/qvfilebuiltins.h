@@ -12,6 +12,11 @@ constexpr int qvSinkBufferSize = 0x800000;  // bytes, at first
 // vector of that name when the last open made the file.
 class FileSink : public QvSink {
   public:
+    struct Settings {
+        Any filename;
+        int bufsize = qvSinkBufferSize;
+    };
+
     FileSink() = default;
     ~FileSink() override;
 
@@ -26,15 +31,12 @@ class FileSink : public QvSink {
     QvBufStream* stream() const override;
 
   private:
-    friend struct FileSinkParams;
-
     int writeOut();
     int failFlush();
     void finish(int abort);
 
     mutable QvFileBufStream stream_{this};
-    Any filename_;
-    int bufsize_ = qvSinkBufferSize;
+    Settings settings_;
     bool doNothing_ = false;
     Any written_;  // name of the file made by the last open, invalid for none
 };

@@ -4,6 +4,7 @@
 #include <string>
 
 #include "core/arch/qvassert.h"
+#include "core/encode/muxerlimits_p.h"
 #include "core/engine/log/qvlog.h"
 #include "core/engine/modules/qvregistry.h"
 #include "core/job/filtersstate.h"
@@ -13,33 +14,9 @@
 
 namespace {
 
-struct Limits {
-    QvAVS3plet<int> streams;
-    int total = 0;
-
-    int of(int type) const {
-        switch (type) {
-            case 0: return total;
-            case qvVideoStream: return streams.video;
-            case qvAudioStream: return streams.audio;
-            case qvSubpicStream: return streams.subpic;
-            default: QV_FAIL("EncodePipe.maxStreams: invalid stream type");
-        }
-    }
-};
-
-// `complaint` takes the multiplexer's name; it is logged before the assertion.
-Limits limitsOf(QvMuxer* muxer, const char* complaint) {
-    QV_ASSERT_MSG(muxer, "EncodePipe: muxer is null.");
-    Any answer;
-    muxer->getParam("maxStreams", answer);
-    if (!answer.isDict()) {
-        qv_dbg()->error(complaint, muxer->name());
-        QV_FAIL_PLAIN();
-    }
-    const auto& dict = answer.asDict();
-    return {{dict.getInt32("vids", 0), dict.getInt32("auds", 0), dict.getInt32("subs", 0)},
-            dict.getInt32("total", 0)};
+MuxerLimits limitsOf(const QvMuxer* muxer) {
+    return MuxerLimits::of(muxer,
+                           "EncodePipe.maxStreams: muxer '%s' does not implement 'maxStreams' parameter");
 }
 
 const char* channelsText(int channels) {
@@ -109,27 +86,16 @@ int QvEncodePipe::flush() {
 int QvEncodePipe::addSubpicStream(const Any& params) { return addStream(qvSubpicStream, params); }
 
 int QvEncodePipe::canAddStreams(int type) const {
-    const auto limits =
-        limitsOf(getMuxer(), "EncodePipe.canAddStreams: muxer '%s' returned invalid value for 'maxStreams'");
-    const int left = limits.total - nrStreams(qvAllStreams);
-    if (type == 0) return left;
-    const int limit = limits.of(type);
-    if (limit == 0) return -1;
-    if (left <= 0) return 0;
-    return limit - nrStreams(type);
+    return qvStreamRoom(getMuxer(), type, nrStreams(type), nrStreams(qvAllStreams));
 }
 
 int QvEncodePipe::maxStreams(QvAVS3plet<int>* limits) const {
-    const auto all =
-        limitsOf(getMuxer(), "EncodePipe.maxStreams: muxer '%s' does not implement 'maxStreams' parameter");
-    if (limits) *limits = all.streams;
+    const auto all = limitsOf(getMuxer());
+    if (limits) *limits = {all.video, all.audio, all.subpic};
     return all.total;
 }
 
-int QvEncodePipe::maxStreams(int type) const {
-    return limitsOf(getMuxer(), "EncodePipe.maxStreams: muxer '%s' does not implement 'maxStreams' parameter")
-        .of(type);
-}
+int QvEncodePipe::maxStreams(int type) const { return limitsOf(getMuxer()).ofType(type); }
 
 bool QvEncodePipe::programsSupported() const {
     const auto* muxer = getMuxer();

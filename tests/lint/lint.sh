@@ -59,8 +59,9 @@ headers_alone() {
             g++ -std=c++20 -fsyntax-only -Wall -Wextra -I. -x c++ - || { echo "not alone: {}"; exit 255; }'
 }
 
-# Includes go down the floors, and the system is called in one place.
+# Includes go down the floors, a class is in one source, and the system is called in one place.
 rooms() { python3 tests/lint/rooms.py; }
+one_source() { python3 tests/lint/oneclass.py; }
 door() { python3 tests/lint/door.py; }
 
 # The shared library exports the public interface and nothing else.
@@ -81,6 +82,7 @@ check 'format' formatted
 check 'warnings' no_warnings
 check 'headers alone' headers_alone
 check 'rooms' rooms
+check 'one source a class' one_source
 check "the system's door" door
 check 'exported symbols' exported_symbols
 check 'README commands' readme_commands

@@ -6,6 +6,7 @@ import unittest
 
 sys.path.insert(0, str(pathlib.Path(__file__).parent))
 import door
+import oneclass
 import rooms
 
 ROOT = pathlib.Path(__file__).resolve().parents[2]
@@ -68,6 +69,31 @@ class Planted(unittest.TestCase):
                 "std::thread worker_;\nthen.system(1);\n// std::getenv(name)\nlog(\"fopen(x)\");\n"
                 "std::remove(list.begin(), list.end(), 0);\nusing Time = std::chrono::milliseconds;\n")
         self.assertEqual(door.check(self.tree({"core/media/unit.cpp": text})), [])
+
+    def test_class_in_several_sources(self):
+        first = "int Thing::a() { return 1; }\n"
+        for second in ("void Thing::b() {}", "Thing::Thing() = default;", "Thing::~Thing() {}",
+                       "int Thing::count_ = 0;", "std::unique_ptr<Part>\nThing::c(int x) {\n}",
+                       "Thing::Inner* Thing::find(int) { return nullptr; }", "Thing::Inner::Inner() {}",
+                       "bool Thing::operator==(const Thing&) const {", "struct Thing::Private {\n    int a;\n};",
+                       "namespace qv {\nint qv::Thing::d() {}\n}"):
+            with self.subTest(second):
+                tree = self.tree({"core/media/a.cpp": first, "core/media/b.cpp": "#include <a>\n" + second})
+                self.assertEqual([fault.split(":")[0] for fault in oneclass.check(tree, ())], ["Thing"])
+                self.assertEqual(oneclass.check(tree, ("Thing",)), [])
+
+    def test_class_that_only_seems_to_be_in_several_sources(self):
+        own = "namespace {\nclass Thing final : Base {\n    void a();\n};\nvoid Thing::a() {}\n}\n"
+        files = {"core/media/a.cpp": "int Thing::a() { return Other::b(); }\n// Other::c() {}\nusing Other::d;\n",
+                 "core/media/b.cpp": "int Other::b() {\n    Thing::a();\n}\nconst int x = Thing::a();\n",
+                 "core/media/c.cpp": "Thing::Inner make(int) {}\nstatic_assert(Thing::size == 1);\n",
+                 "core/media/d.cpp": own, "core/media/e.cpp": "template <class T>\nint Thing<T>::a() {}\n",
+                 "core/media/g.h": "namespace names {\nint f();\n}\n", "core/media/g.cpp": "int names::f() {}\n",
+                 "core/media/h.cpp": "int names::g() {}\nvoid QvUtil::a() {}\n", "core/media/i.cpp": "void QvUtil::b() {}\n"}
+        self.assertEqual(oneclass.check(self.tree(files), ()), [])
+
+    def test_list_of_classes_in_several_sources_gets_shorter(self):
+        self.assertEqual(len(oneclass.check(self.tree({"core/media/a.cpp": "int Thing::a() {}\n"}), ("Thing",))), 1)
 
 
 class Documents(unittest.TestCase):
