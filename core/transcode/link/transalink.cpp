@@ -1,5 +1,6 @@
-// The audio link: its format, its range of samples and its conversion.
-#include <limits>
+#include "core/transcode/link/transalink.h"
+
+#include <algorithm>
 
 #include "core/arch/qvassert.h"
 #include "core/arch/qvexception.h"
@@ -10,28 +11,49 @@
 #include "core/engine/qvutil.h"
 #include "core/filter/qvprocesspipe.h"
 #include "core/filter/qvprocessutil.h"
+#include "core/job/jobdescription.h"
 #include "core/transcode/link/audiomuxer.h"
-#include "core/transcode/link/translink.h"
+#include "core/transcode/link/channelmatrix_p.h"
+#include "core/transcode/link/linkopen_p.h"
+#include "core/transcode/link/sampleclock_p.h"
+#include "core/transcode/link/steplog_p.h"
+#include "core/transcode/link/streammix_p.h"
 
 namespace {
 
-constexpr long long unknownLength = 92233720368547LL;  // samples of a stream that does not tell
-constexpr int defaultBits = 16;
+MediaTime earlier(const MediaTime& a, const MediaTime& b) { return b < a ? b : a; }
 
-int bytesOf(int bits) { return (bits + 7) / 8; }
-
-// An instant within the sample. Not every rate divides the timescale: where a tick before it is meant, the
-// next one is, since its position would otherwise be the sample before.
-MediaTime sampleTime(long long sample, int samplerate) {
-    const MediaTime time(sample, samplerate, MediaTime::defaultTimescale);
-    return time.position(samplerate) < sample ? time + MediaTime(1) : time;
+// One element a stream of the decoder: its channels where the matrix names it and the decoder says, otherwise
+// -1.
+std::vector<int> inputChannels(const QvDecodePipe& decoder, const ChannelMatrix& matrix) {
+    std::vector<int> channels(static_cast<std::size_t>(std::max(decoder.nrAudioStreams(), 0)), -1);
+    for (const ChannelMatrix::Row& row : matrix.rows())
+        for (const ChannelSource& source : row) {
+            if (source.stream < 0 || source.stream >= static_cast<int>(channels.size())) continue;
+            const Any name = Any::sprintf("audio%d/channels", source.stream);
+            const Any answer = decoder.getParam(name.asString());
+            if (answer.isInt32()) channels[static_cast<std::size_t>(source.stream)] = answer.asInt32();
+        }
+    return channels;
 }
 
-MediaTime earlier(const MediaTime& a, const MediaTime& b) { return b < a ? b : a; }
+int channelsOf(const QvDecodePipe& decoder, int stream) {
+    return decoder.getAudioParam(stream, "channels").asInt32(0);
+}
+
+std::vector<StreamMix::Part> partsOf(const QvDecodePipe& decoder, const AnyVector& streams) {
+    std::vector<StreamMix::Part> parts;
+    for (const Any& stream : streams)
+        parts.push_back({stream.asInt32(), channelsOf(decoder, stream.asInt32())});
+    return parts;
+}
 
 }  // namespace
 
-TransALink::TransALink() = default;
+TransALink::TransALink()
+    : clock_(std::make_unique<SampleClock>()),
+      matrix_(std::make_unique<ChannelMatrix>()),
+      mix_(std::make_unique<StreamMix>()) {}
 
 TransALink::~TransALink() {
     if (opened_) TransALink::close();
@@ -59,90 +81,91 @@ QvAudioEncoder* TransALink::audioEncoder() const {
     return encoder;
 }
 
-int TransALink::open(const AnyDict* params) {
+int TransALink::openWith(const LinkOpen& given) {
     if (opened_) return QvStatus::failed;
     audioPipe_.reset();
     smartRendering_ = false;
     readLogProgress();
-    if (params && (params->isSet("startFrame") || params->isSet("stopFrame")))
-        QV_FAIL("startFrame and stopFrame are deprecated. Use 'inOutPoints'.");
+    if (given.frameNumbers) QV_FAIL("startFrame and stopFrame are deprecated. Use 'inOutPoints'.");
     AnyDict stream;
     _getInParams(stream);
-    if (const int result = readFormat(stream)) return result;
+    if (const int result = readFormats(stream)) return result;
     QV_ASSERT(decoder_->isSelected(qvAudioStream, decStreamNr_));
-    takeMatrix(params);
+    takeMatrix(given.connMatrix);
     MediaTime delay;
-    if (const int result = buildPipe(params, delay)) return result;
-
-    const long long samples = stream.getInt64("samples", unknownLength);
-    qv_dbg()->debug("ALink.open: input stream has %lld samples", samples);
-    const MediaTime end = sampleTime(samples, inSamplerate_);
-    const bool given = takePoints(params, end);
-    qv_dbg()->debug("%s", given ? "ALink.open: In/out points are set."
-                                : "ALink.open: In/out points constructed from duration.");
-    if (given && outPoint() <= inPoint())
-        return setError(QvStatus::failed, "The out point does not lie behind the in point");
-    shiftPoints(delay, end);
-    computeRange();
-    setupSmartRender(params);
-    if (audioPipe_) {
-        QvProcessUtil::applyStreamReport(audioPipe_.get(), decoder_, decStreamNr_, inStart_, inEnd_);
-        if (audioPipe_->open() != QvStatus::ok) {
-            setError(QvStatus::failed, audioPipe_->errorDesc());
-            audioPipe_.reset();
-            return QvStatus::failed;
-        }
-    }
-    processed_ = -1;
+    if (const int result = buildPipe(given.audioFilters, delay)) return result;
+    *clock_ = SampleClock(in_.samplerate, out_.samplerate);
+    if (const int result = takeRange(given, delay)) return result;
+    setupSmartRender(given.smartRender);
+    if (const int result = openPipe()) return result;
     steps_ = 0;
-    finished_ = silenceLogged_ = worked_ = false;
+    finished_ = worked_ = false;
     opened_ = true;
     return QvStatus::ok;
 }
 
-int TransALink::readFormat(const AnyDict& stream) {
-    inSamplerate_ = stream.getInt32("samplerate", 0);
-    inChannels_ = stream.getInt32("channels", 0);
-    outSamplerate_ = encoder_->getParam(_encPar("samplerate").asString()).asInt32(0);
-    outChannels_ = encoder_->getParam(_encPar("channels").asString()).asInt32(0);
-    if (inSamplerate_ < 1) return setError(QvStatus::failed, "Could not get 'samplerate' from decoder");
-    if (inChannels_ < 1) return setError(QvStatus::failed, "Could not get 'channels' from decoder");
-    if (outSamplerate_ < 1) return setError(QvStatus::failed, "Could not get 'samplerate' from encoder");
-    if (outChannels_ < 1) return setError(QvStatus::failed, "Could not get 'channels' from encoder");
-    inBits_ = stream.getInt32("bitsPerSample", defaultBits);
-    outBits_ = encoder_->getParam(_encPar("bitsPerSample").asString()).asInt32(defaultBits);
-    inBytesPerSample_ = bytesOf(inBits_);
-    outBytesPerSample_ = bytesOf(outBits_);
+int TransALink::readFormats(const AnyDict& stream) {
+    in_ = AudioFormat(stream);
+    const auto ask = [this](const char* name) { return encoder_->getParam(_encPar(name).asString()); };
+    out_ = AudioFormat();
+    out_.samplerate = ask("samplerate").asInt32(0);
+    out_.channels = ask("channels").asInt32(0);
+    if (in_.samplerate < 1) return setError(QvStatus::failed, "Could not get 'samplerate' from decoder");
+    if (in_.channels < 1) return setError(QvStatus::failed, "Could not get 'channels' from decoder");
+    if (out_.samplerate < 1) return setError(QvStatus::failed, "Could not get 'samplerate' from encoder");
+    if (out_.channels < 1) return setError(QvStatus::failed, "Could not get 'channels' from encoder");
+    out_.bits = ask("bitsPerSample").asInt32(AudioFormat::defaultBits);
     return QvStatus::ok;
 }
 
 // The matrix of the job where it fits, otherwise the one that the codecs' layouts give.
-void TransALink::takeMatrix(const AnyDict* params) {
-    connMatrix_.clear();
-    if (params && params->get("connMatrix").isVector()) connMatrix_ = params->get("connMatrix").asVector();
-    if (_verifyConnMatrix()) return;
+void TransALink::takeMatrix(const AnyVector& given) {
+    if (takesMatrix(given)) return;
     qv_dbg()->debug("Using default audio connection matrix");
     AudioMuxer muxer;
-    muxer.init(decoder_, audioEncoder(), outChannels_, nullptr, decStreamNr_);
-    muxer.store(connMatrix_);
-    _verifyConnMatrix();
+    AnyVector matrix;
+    muxer.init(decoder_, audioEncoder(), out_.channels, nullptr, decStreamNr_);
+    muxer.store(matrix);
+    takesMatrix(matrix);
 }
 
-int TransALink::buildPipe(const AnyDict* params, MediaTime& delay) {
+bool TransALink::takesMatrix(const AnyVector& given) {
+    *matrix_ = ChannelMatrix(given, decStreamNr_);
+    const std::string fault = matrix_->fault(out_.channels, inputChannels(*decoder_, *matrix_));
+    qv_dbg()->debug("%s", fault.empty() ? "Audio channel map OK" : fault.c_str());
+    for (int i = 0; fault.empty() && i < matrix_->size(); ++i)
+        qv_dbg()->debug("%i <- %s", i, matrix_->describe(i).c_str());
+    return fault.empty();
+}
+
+int TransALink::buildPipe(const AnyVector& filters, MediaTime& delay) {
     AudioJobDescription job;
-    job.inBitsPerSample = inBits_;
-    job.inSamplerate = inSamplerate_;
-    job.inChannels = inChannels_;
-    job.outBitsPerSample = outBits_;
-    job.outSamplerate = outSamplerate_;
-    job.outChannels = outChannels_;
-    job.connMatrix = connMatrix_;
-    if (params) job.filters = params->getDict("audioEffects").getVector("customFilters");
+    job.inBitsPerSample = in_.bits;
+    job.inSamplerate = in_.samplerate;
+    job.inChannels = in_.channels;
+    job.outBitsPerSample = out_.bits;
+    job.outSamplerate = out_.samplerate;
+    job.outChannels = out_.channels;
+    job.connMatrix = matrix_->entries();
+    job.filters = filters;
     try {
         audioPipe_.reset(QvProcessUtil::createAudioPipe(job, delay));
     } catch (const QvAssertFailure& failure) {
         return pipeFailed(failure);
     }
+    return QvStatus::ok;
+}
+
+int TransALink::takeRange(const LinkOpen& given, const MediaTime& delay) {
+    qv_dbg()->debug("ALink.open: input stream has %lld samples", in_.samples);
+    const MediaTime end = SampleClock::timeOf(in_.samples, in_.samplerate);
+    const bool points = takePoints(given, end);
+    qv_dbg()->debug("%s", points ? "ALink.open: In/out points are set."
+                                 : "ALink.open: In/out points constructed from duration.");
+    if (points && outPoint() <= inPoint())
+        return setError(QvStatus::failed, "The out point does not lie behind the in point");
+    shiftPoints(delay, end);
+    computeRange();
     return QvStatus::ok;
 }
 
@@ -156,47 +179,50 @@ void TransALink::shiftPoints(const MediaTime& delay, const MediaTime& end) {
 
 void TransALink::computeRange() {
     qv_dbg()->debug("ALink.open: in=%f, out=%f (seconds)", inPoint().seconds(), outPoint().seconds());
-    inStart_ = inPoint().position(inSamplerate_);
-    inEnd_ = outPoint().position(inSamplerate_);
-    qv_dbg()->debug("ALink.open: In start sample= %lld, in end sample=%lld", inStart_, inEnd_);
-    const long long outStart = inPoint().position(outSamplerate_);
-    const long long outEnd = MediaTime(inEnd_, inSamplerate_).position(outSamplerate_);
-    qv_dbg()->debug("ALink.open: Out start sample=%lld, out end sample=%lld", outStart, outEnd);
-    totalInSamples_ = inEnd_ - inStart_;
-    totalOutSamples_ = outEnd - outStart;
+    clock_->setRange(inPoint(), outPoint());
+    qv_dbg()->debug("ALink.open: In start sample= %lld, in end sample=%lld", clock_->inStart(),
+                    clock_->inEnd());
+    qv_dbg()->debug("ALink.open: Out start sample=%lld, out end sample=%lld", clock_->outStart(),
+                    clock_->outEnd());
 }
 
-void TransALink::setupSmartRender(const AnyDict* params) {
+void TransALink::setupSmartRender(int mode) {
     auto& encoder = *audioEncoder();
     qvSetOptionalParam(encoder, "smartRender", 0);
-    const int mode = params ? params->getInt32("smartRender", 0) : 0;
     if (mode == 0) return;
     Any source = Pair(qvAudioStream, decStreamNr_);
     decoder_->getParam("srParams", source);
     if (!source.isDict()) return;
-    source.asDict().set("sample0", inStart_);
+    source.asDict().set("sample0", clock_->inStart());
     Any answer = source;
     encoder.getParam("srPossible", answer);
     if (answer != Any(QvStatus::ok) && answer != Any(QvStatus::warning)) return;
     encoder.setParam("smartRender", mode);
     encoder.setParam("decoderStruct", source);
     smartRendering_ = true;
-    outSamplerate_ = inSamplerate_;
-    totalOutSamples_ = totalInSamples_;
+    clock_->passThrough();
+}
+
+int TransALink::openPipe() {
+    if (!audioPipe_) return QvStatus::ok;
+    QvProcessUtil::applyStreamReport(audioPipe_.get(), decoder_, decStreamNr_, clock_->inStart(),
+                                     clock_->inEnd());
+    if (audioPipe_->open() == QvStatus::ok) return QvStatus::ok;
+    setError(QvStatus::failed, audioPipe_->errorDesc());
+    audioPipe_.reset();
+    return QvStatus::failed;
 }
 
 int TransALink::close() {
     if (!opened_) return QvStatus::ok;
     const int result = audioPipe_ ? closePipe(*audioPipe_) : QvStatus::ok;
     audioPipe_.reset();
-    qv_dbg()->debug("ALink @ %p: closed, %lld samples written", static_cast<void*>(this), processed_ + 1);
+    qv_dbg()->debug("ALink @ %p: closed, %lld samples written", static_cast<void*>(this), clock_->written());
     for (const Any& stream : selectedStreams_) decoder_->deselect(qvAudioStream, stream.toInt32());
-    connMatrix_.clear();
     selectedStreams_.clear();
-    muxStreams_.clear();
-    muxChannels_.clear();
+    *matrix_ = ChannelMatrix();
+    *mix_ = StreamMix();
     silence_.destroy();
-    muxBuffer_.destroy();
     opened_ = false;
     return result;
 }
@@ -205,15 +231,15 @@ int TransALink::totalOutFrames() const { QV_FAIL_PLAIN(); }
 
 double TransALink::samplesPerFrame() const { QV_FAIL_PLAIN(); }
 
-double TransALink::completed() const {
-    if (totalInSamples_ < 1) return 0.0;
-    return static_cast<double>(processed_) * 100.0 / static_cast<double>(totalInSamples_) * inSamplerate_ /
-           outSamplerate_;
-}
+double TransALink::completed() const { return clock_->percent(); }
 
 long long TransALink::outSamplesPerFrames(int n, const QvFramerate& rate) const {
-    return QvUtil::samplesForFrames(n, rate, outSamplerate_);
+    return clock_->samplesFor(n, rate);
 }
+
+long long TransALink::outProcessed() const { return clock_->written(); }
+
+long long TransALink::totalOutSamples() const { return clock_->totalOut(); }
 
 QvCodec* TransALink::filter(const char* name, int index) const {
     return audioPipe_ ? audioPipe_->filter(name, index) : nullptr;
@@ -243,4 +269,146 @@ void TransALink::log() {
     qv_dbg()->debug("---");
     qv_dbg()->debug("Processing:");
     for (int i = 0; i < audioPipe_->nrFilters(); ++i) logFilter(i + 1, *audioPipe_->filter(i));
+}
+
+// --- One step.
+
+int TransALink::processFrame(int n) {
+    QV_ASSERT(n != -1);
+    QV_STEP_LOG("ALink", "processFrame");
+    if (n < 1) {
+        QV_STEP_LOG("ALink", "nothing to process");
+        return QvStatus::ok;
+    }
+    if (smartRendering_) return smartStep(n);
+    if (finished_) {
+        QV_STEP_LOG("ALink", "silence samples=%d", n);
+        return _insertSilence(n);
+    }
+    return audioPipe_ ? pipeStep(n) : directStep(n);
+}
+
+int TransALink::smartStep(int n) {
+    QV_STEP_LOG("ALink", "writeFrame sample =%d...", n);
+    const int result = audioEncoder()->writePcm(nullptr, n);
+    clock_->wrote(n);
+    finished_ = clock_->complete();
+    ++steps_;
+    if (finished_) logDone("Audio smart rendering done");
+    return result;
+}
+
+// From the decoder's buffer straight to the encoder.
+int TransALink::directStep(int n) {
+    auto* pcm = decoder_->getAudioPtr(decStreamNr_);
+    QV_STEP_LOG("ALink", "read samples %d", n);
+    const int read = decoder_->readSamples(n, decStreamNr_);
+    QV_STEP_LOG("ALink", "read samples done, result=%d", read);
+    if (read < n) {
+        finished_ = true;
+        if (!worked_) return readFailed();
+    }
+    int result = QvStatus::ok;
+    const bool holds = pcm && pcm->inited() && pcm->samples() > 0;
+    if (holds && (read >= 0 || read == QvStatus::endOfStream)) {
+        QV_STEP_LOG("ALink", "writePcm samples=%d", pcm->samples());
+        result = audioEncoder()->writePcm(pcm, -1);
+        QV_STEP_LOG("ALink", "writePcm done result=%d", result);
+        clock_->wrote(pcm->samples());
+    }
+    return endStep(result);
+}
+
+// What the pipe has beyond the samples that are due stays in it.
+int TransALink::pipeStep(int n) {
+    QV_STEP_LOG("ALink", "aprocess samples=%d", n);
+    const int processed = audioPipe_->process(decoder_, decStreamNr_, n);
+    QV_STEP_LOG("ALink", "aprocess done, result=%d", processed);
+    if (processed != QvStatus::ok) {
+        finished_ = true;
+        if (!worked_) return readFailed();
+    }
+    auto* pcm = audioPipe_->pcm();
+    const int count = std::min(audioPipe_->samples(), n);
+    int result = QvStatus::ok;
+    if (pcm && count > 0) {
+        QV_STEP_LOG("ALink", "writePcm samples=%d", count);
+        result = audioEncoder()->writePcm(pcm, count);
+        QV_STEP_LOG("ALink", "writePcm done, result=%d", result);
+        clock_->wrote(count);
+        audioPipe_->erase(count);
+    }
+    return endStep(result);
+}
+
+int TransALink::endStep(int result) {
+    if (result != QvStatus::ok) copyError(result, audioEncoder()->errorDesc());
+    if (clock_->complete()) finished_ = true;
+    ++steps_;
+    if (finished_) logDone("Audio processing done");
+    worked_ = true;
+    QV_STEP_LOG("ALink", "processFrame done, result=%d", result);
+    return result == QvStatus::endOfStream ? QvStatus::ok : result;
+}
+
+int TransALink::readFailed() {
+    return setError(QvStatus::failed,
+                    Any::sprintf("ALink @ %p: Audio error, can not read samples", static_cast<void*>(this)));
+}
+
+void TransALink::logDone(const char* what) const {
+    qv_dbg()->debug("ALink @ %p: %s, transcoded %lld samples (%lld was expected), last video frame is %d",
+                    static_cast<const void*>(this), what, clock_->written(), clock_->totalOut(), steps_);
+}
+
+bool TransALink::prepareSilence(int n) {
+    const bool fits = silence_.inited() && silence_.channels() == out_.channels &&
+                      silence_.bytesPerSample() == out_.bytesPerSample() && silence_.size() >= n;
+    if (!fits && silence_.init(n, out_.channels, out_.bytesPerSample(), clock_->outRate()) != QvStatus::ok)
+        return false;
+    if (silence_.samples() == n) return true;
+    silence_.setSamples(0);
+    return silence_.addSilence(n) == QvStatus::ok;
+}
+
+int TransALink::_insertSilence(int n) {
+    QV_ASSERT(n != -1);
+    if (n < 1) return QvStatus::ok;
+    if (!prepareSilence(n)) return setError(QvStatus::outOfMemory, "no memory for silence");
+    audioEncoder()->writePcm(&silence_, -1);
+    if (clock_->wroteSilence(n))
+        qv_log()->info("Audio stream shorter than the video stream, inserting silence at the end.");
+    return QvStatus::ok;
+}
+
+// --- Several input streams.
+
+AnyVector TransALink::_getNeededInputStreams(const AnyVector& matrix, AnyVector& newlySelected, bool select) {
+    AnyVector streams;
+    for (const int stream : ChannelMatrix(matrix, decStreamNr_).streams()) streams.append(Any(stream));
+    if (!select) return streams;
+    for (const Any& stream : streams) {
+        if (decoder_->isSelected(qvAudioStream, stream.asInt32())) continue;
+        if (decoder_->select(qvAudioStream, stream.asInt32()) == QvStatus::ok)
+            newlySelected.append(stream);
+        else
+            qv_dbg()->log(QvLogMask::error, "ALink.open: Can not select stream %d", stream.asInt32());
+    }
+    selectedStreams_.extend(newlySelected);
+    *mix_ = StreamMix(partsOf(*decoder_, streams));
+    return streams;
+}
+
+int TransALink::_filterChannelNr(const AnyVector& streams, int stream, int channel) const {
+    return StreamMix(partsOf(*decoder_, streams)).channelNr(stream, channel);
+}
+
+AnyVector TransALink::_connMatrixToFilter(const AnyVector& matrix) const {
+    return mix_->numbered(ChannelMatrix(matrix, decStreamNr_));
+}
+
+QvPcm* TransALink::_muxStreams() {
+    std::vector<const QvPcm*> inputs;
+    for (const StreamMix::Part& part : mix_->parts()) inputs.push_back(decoder_->getAudioPtr(part.stream));
+    return mix_->interleave(inputs);
 }

@@ -1,6 +1,6 @@
-// The video link: its streams, its frame range and its conversion.
+#include "core/transcode/link/transvlink.h"
+
 #include <algorithm>
-#include <string>
 
 #include "core/arch/qvassert.h"
 #include "core/arch/qvexception.h"
@@ -11,26 +11,41 @@
 #include "core/engine/qvutil.h"
 #include "core/filter/qvprocesspipe.h"
 #include "core/filter/qvprocessutil.h"
-#include "core/job/filtersstate.h"
-#include "core/measure/qvnum.h"
-#include "core/transcode/link/translink.h"
+#include "core/job/streamformat.h"
+#include "core/media/qvbuffer.h"
+#include "core/transcode/link/encodertraits_p.h"
+#include "core/transcode/link/framerange_p.h"
+#include "core/transcode/link/linkopen_p.h"
+#include "core/transcode/link/qualitylog_p.h"
+#include "core/transcode/link/smartrender_p.h"
+#include "core/transcode/link/steplog_p.h"
+#include "core/transcode/link/streamicon_p.h"
 
-TransVLink::TransVLink() = default;
+namespace {
 
-TransVLink::TransVLink(const TransVLink& other) : TransLink(other) { *this = other; }
+int views(const Any& value) { return std::max(value.asInt32(1), 1); }
+
+}  // namespace
+
+struct TransVLink::Step {
+    QvFrame* frame = nullptr;  // to write, owned by the pipe or the decoder
+    int read = QvStatus::ok;
+    int write = QvStatus::ok;
+    bool smart = false;  // the encoder takes the coded data itself
+};
+
+TransVLink::TransVLink()
+    : range_(std::make_unique<FrameRange>()), smartRender_(std::make_unique<SmartRender>()) {}
+
+TransVLink::TransVLink(const TransVLink& other) : TransVLink() { *this = other; }
 
 TransVLink& TransVLink::operator=(const TransVLink& other) {
     if (this == &other) return *this;
     if (opened_) TransVLink::close();
     TransLink::operator=(other);
-    qualitySetup_ = other.qualitySetup_;
     outFramerate_ = other.outFramerate_;
-    nrFramesIn_ = other.nrFramesIn_;
-    nrFramesOut_ = other.nrFramesOut_;
-    pairCompleted_ = other.pairCompleted_;
+    *range_ = *other.range_;
     framesWritten_ = -1;
-    startFrame_ = other.startFrame_;
-    stopFrame_ = other.stopFrame_;
     decViews_ = other.decViews_;
     encViews_ = other.encViews_;
     metaSources_.clear();
@@ -42,8 +57,6 @@ TransVLink& TransVLink::operator=(const TransVLink& other) {
 TransVLink::~TransVLink() {
     if (opened_) TransVLink::close();
 }
-
-int TransVLink::views(const Any& value) const { return std::max(value.asInt32(1), 1); }
 
 int TransVLink::init(QvDecodePipe* decoder, int decStream, QvEncodePipe* encoder, int encStream) {
     TransLink::init(decoder, decStream, encoder, encStream);
@@ -71,108 +84,79 @@ int TransVLink::init(QvDecodePipe* decoder, int decStream, QvEncodePipe* encoder
     return QvStatus::ok;
 }
 
-int TransVLink::open(const AnyDict* params) {
+int TransVLink::openWith(const LinkOpen& given) {
     if (opened_) return QvStatus::failed;
-    releasePipe();
+    videoPipe_.reset();
     readLogProgress();
-    if (params && (params->isSet("startFrame") || params->isSet("stopFrame")))
-        QV_FAIL("startFrame and stopFrame are deprecated. Use inOutPoints.");
+    if (given.frameNumbers) QV_FAIL("startFrame and stopFrame are deprecated. Use inOutPoints.");
     AnyDict stream;
     decoder_->getStreamParams(qvVideoStream, decStreamNr_, stream);
-    const Any inRate = stream.get("framerate");
-    if (!inRate.isFramerate() || inRate.asFramerate().rate().ratio() <= 0)
-        return setError(QvStatus::failed, "Could not get 'framerate' from decoder");
-    const Any outRate = encoder_->getParam(_encPar("framerate").asString());
-    if (!outRate.isFramerate() || outRate.asFramerate().rate().ratio() <= 0)
-        return setError(QvStatus::failed, "Could not get 'framerate' from encoder");
+    const VideoFormat in(stream);
     job_ = VideoJobDescription();
-    job_.inFramerate = inRate.asFramerate();
-    job_.outFramerate = outFramerate_ = outRate.asFramerate();
-    if (const int result = takeFrameRange(params, stream)) return result;
-    const bool chapters = applyChapters(params);
-    describeJob(params, stream);
+    if (const int result = readRates(in)) return result;
+    if (const int result = takeRange(given, in)) return result;
+    const bool chapters = applyChapters(given);
+    describeJob(given, in);
     QV_ASSERT(decViews_ >= encViews_);
     if (const int result = buildPipe()) return result;
     QvProcessUtil::adjustVideoEncoder(job_, videoPipe_.get(), encoder_, encStreamNr_);
-    setupSmartRender(params && params->get("smartRender").isTrue() && !chapters);
-    for (const auto& source : metaSources_) {
-        qvSetOptionalParam(*encoder_->videoEncoder(encStreamNr_), "ccMode",
-                           static_cast<const AnyDict&>(source->params));
-        // It is read once a frame, whatever rate its own times are written at.
-        if (source->decoder != decoder_) qvSetOptionalParam(*source->decoder, "readRate", job_.inFramerate);
-    }
+    smartRender_->negotiate(*decoder_, decStreamNr_, *encoder_, encStreamNr_, job_, videoPipe_.get(), *range_,
+                            given.passPicture && !chapters);
+    prepareMetaSources();
     finished_ = false;
     framesWritten_ = 0;
-    setupLogger(params);
+    qualityLog_ = QualityLog::start(given.qualityStats, *encoder_, encStreamNr_);
     opened_ = true;
     return QvStatus::ok;
 }
 
-// What the encoder takes: its choice, or the input's format where it can, or the first that it names.
-unsigned TransVLink::chooseFOURCC(unsigned inFOURCC) const {
-    const Any selected = encoder_->getParam(_encPar("selectedFOURCC").asString());
-    if (selected.isInt32()) return static_cast<unsigned>(selected.asInt32());
-    Any list = encoder_->getParam(_encPar("inFOURCC").asString());
-    if (!list.isVector()) {
-        const auto* encoder = encoder_->videoEncoder(encStreamNr_);
-        if (encoder && encoder->module()) list = encoder->getAttr("inFOURCC");
-    }
-    if (!list.isVector() || list.asVector().empty()) return inFOURCC;
-    if (list.asVector().contains(Any(static_cast<int>(inFOURCC)))) return inFOURCC;
-    // 16 bits go on as 16 bits, whatever the list says.
-    if (inFOURCC == QvFourcc::W016) return QvFourcc::Y216;
-    return static_cast<unsigned>(list.asVector().at(0).asInt32(static_cast<int>(inFOURCC)));
+int TransVLink::readRates(const VideoFormat& in) {
+    if (!in.hasRate()) return setError(QvStatus::failed, "Could not get 'framerate' from decoder");
+    const Any out = encoder_->getParam(_encPar("framerate").asString());
+    if (!out.isFramerate() || out.asFramerate().rate().ratio() <= 0)
+        return setError(QvStatus::failed, "Could not get 'framerate' from encoder");
+    job_.inFramerate = in.framerate;
+    job_.outFramerate = outFramerate_ = out.asFramerate();
+    return QvStatus::ok;
 }
 
-int TransVLink::takeFrameRange(const AnyDict* params, const AnyDict& stream) {
-    const QvFramerate& inRate = job_.inFramerate;
-    const MediaTime end(stream.getInt32("frames", 0), inRate, MediaTime::defaultTimescale);
-    const bool given = takePoints(params, end);
-    qv_dbg()->debug("%s", given ? "VLink.open: In/out points are set"
-                                : "VLink.open: In/out points constructed from total duration");
-    startFrame_ = static_cast<int>(inPoint().position(inRate));
-    stopFrame_ = static_cast<int>(outPoint().position(inRate)) - 1;
+int TransVLink::takeRange(const LinkOpen& given, const VideoFormat& in) {
+    const bool points = takePoints(given, MediaTime(in.frames, in.framerate, MediaTime::defaultTimescale));
+    qv_dbg()->debug("%s", points ? "VLink.open: In/out points are set"
+                                 : "VLink.open: In/out points constructed from total duration");
+    FrameRange range(inPoint(), outPoint(), in.framerate);
     qv_dbg()->debug("VLink.open: in=%f, out=%f (sec)", inPoint().seconds(), outPoint().seconds());
-    qv_dbg()->debug("VLink.open: Start frame=%d, end frame=%d", startFrame_, stopFrame_);
-    if (given && stopFrame_ < startFrame_)
+    qv_dbg()->debug("VLink.open: Start frame=%d, end frame=%d", range.start, range.stop);
+    if (points && range.empty())
         return setError(QvStatus::failed, "The out point does not lie behind the in point");
-    nrFramesIn_ = stopFrame_ - startFrame_ + 1;
-    // Two frames go into each one when the rate is halved.
-    pairCompleted_ = nrFramesIn_ % 2 != 0 && QvNum::equ(2.0 * outFramerate_.rate().ratio(),
-                                                        inRate.rate().ratio(), QvRatio::tolerance);
-    if (pairCompleted_) {
-        ++stopFrame_;
-        ++nrFramesIn_;
-    }
-    nrFramesOut_ =
-        static_cast<int>(QvRatio::multyplyByRatio(nrFramesIn_, outFramerate_.rate(), inRate.rate()));
+    range.convert(in.framerate, outFramerate_);
+    *range_ = range;
     return QvStatus::ok;
 }
 
 // True when the encoder got at least one chapter point.
-bool TransVLink::applyChapters(const AnyDict* params) {
-    const AnyVector& chapters = params ? params->getVector("chapters") : AnyVector::null();
-    if (chapters.empty()) return false;
+bool TransVLink::applyChapters(const LinkOpen& given) {
+    if (given.chapters.empty()) return false;
     AnyVector points;
-    QvProcessUtil::rescaleTimePoints(chapters, job_.inFramerate, outFramerate_, &points);
+    QvProcessUtil::rescaleTimePoints(given.chapters, job_.inFramerate, outFramerate_, &points);
     qv_dbg()->debug("Vlink.open: applying %d chapter points", points.size());
     qvSetOptionalParam(*encoder_->videoEncoder(encStreamNr_), "chapters", points);
     return true;
 }
 
-void TransVLink::describeJob(const AnyDict* params, const AnyDict& stream) {
-    job_.inFOURCC = static_cast<unsigned>(stream.getInt32("FOURCC", 0));
-    job_.inFrameAspect = stream.getDouble("frameAspect", 1.0);
-    job_.inWidth = stream.getInt32("width", 0);
-    job_.inHeight = stream.getInt32("height", 0);
-    job_.startFrame = startFrame_;
-    job_.stopFrame = stopFrame_;
-    const Any blanking = encoder_->getParam(_encPar("_needTopBlanking").asString());
-    job_.topBlankingLines = blanking.isInt32() ? blanking.asInt32() : 0;
-    job_.outFOURCC = chooseFOURCC(job_.inFOURCC);
-    job_.outWidth = encoder_->getParam(_encPar("width").asString()).asInt32(0);
-    job_.outHeight = encoder_->getParam(_encPar("height").asString()).asInt32(0);
-    if (params && params->get("effects").isDict()) job_.filters = params->get("effects").asDict();
+void TransVLink::describeJob(const LinkOpen& given, const VideoFormat& in) {
+    const EncoderTraits out(*encoder_, encStreamNr_);
+    job_.inFOURCC = in.fourcc;
+    job_.inFrameAspect = in.frameAspect;
+    job_.inWidth = in.width;
+    job_.inHeight = in.height;
+    job_.startFrame = range_->start;
+    job_.stopFrame = range_->stop;
+    job_.topBlankingLines = out.topBlankingLines;
+    job_.outFOURCC = out.formatFor(in.fourcc);
+    job_.outWidth = out.width;
+    job_.outHeight = out.height;
+    job_.filters = given.effects;
 }
 
 int TransVLink::buildPipe() {
@@ -192,12 +176,12 @@ void TransVLink::_setTotalVDuration() {
         return std::max(1, videoPipe_->filter(i)->getParam("_rateFactor").asInt32(1));
     };
     const int filters = videoPipe_->nrFilters();
-    long long total = nrFramesIn_, behind = 1;  // `behind`: frames that later filters make of one
+    long long total = range_->in, behind = 1;  // `behind`: frames that later filters make of one
     for (int i = 0; i < filters; ++i) behind *= factor(i);
     for (int i = 0; i < filters; ++i) {
         auto& filter = *videoPipe_->filter(i);
         if (filter.getParam("_isFramerateConverter").isTrue())
-            total = nrFramesOut_ / behind;
+            total = range_->out / behind;
         else
             qvSetOptionalParam(filter, "_totalFrames", static_cast<int>(total));
         total *= factor(i);
@@ -205,84 +189,33 @@ void TransVLink::_setTotalVDuration() {
     }
 }
 
-// A pipe rules smart rendering out unless it only makes room for what the encoder lays out differently.
-bool TransVLink::pipeAllowsSmartRender() const {
-    if (!videoPipe_) return true;
-    if (videoPipe_->nrFilters() != 1 || Any(videoPipe_->filter(0)->name()) != "scaler") return false;
-    const bool onlyBlanks =
-        job_.topBlankingLines != 0 && job_.inWidth == job_.outWidth &&
-        (job_.outHeight - job_.topBlankingLines == job_.inHeight || job_.outHeight == job_.inHeight);
-    const bool sameFamily = Any(decoder_->name()) == "dvcamdec" &&
-                            Any(encoder_->videoEncoder(encStreamNr_)->name()) == "dv100venc";
-    const bool storedNarrow =
-        (job_.inWidth == 960 && job_.outWidth == 1280) || (job_.inWidth == 1440 && job_.outWidth == 1920);
-    return onlyBlanks || (sameFamily && storedNarrow);
-}
-
-void TransVLink::setupSmartRender(bool wanted) {
-    auto* encoder = encoder_->videoEncoder(encStreamNr_);
-    QV_ASSERT(encoder);
-    qvSetOptionalParam(*encoder, "smartRender", 0);
-    if (!wanted || !pipeAllowsSmartRender()) return;
-    Any source = Pair(qvVideoStream, decStreamNr_);
-    decoder_->getParam("srParams", source);
-    if (!source.isDict() || source.asDict().empty()) return;
-    source.asDict().set("frame0", startFrame_);
-    source.asDict().set("nrFrames", stopFrame_ - startFrame_ + 1);
-    Any possible = source;
-    encoder->getParam("srPossible", possible);
-    // An encoder that doesn't know the question leaves it as it was.
-    if (possible.isDict() || !possible.isTrue()) return;
-    encoder->setParam("smartRender", 1);
-    encoder->setParam("decoderStruct", source);
-    decoder_->setParam("smartRenderingOn", Pair(qvVideoStream, decStreamNr_));
-}
-
-void TransVLink::setupLogger(const AnyDict* params) {
-    const AnyVector& logs = params ? params->getVector("qualityStats") : AnyVector::null();
-    if (logs.empty()) return;
-    auto& encoder = *encoder_->videoEncoder(encStreamNr_);
-    qvSetOptionalParam(encoder, "getQualityStats", 1);
-    if (!encoder.getParam("getQualityStats").isTrue()) {
-        qv_log()->error("Encoder %s does not support PSNR logging.", encoder.name());
-        return;
+void TransVLink::prepareMetaSources() {
+    for (const auto& source : metaSources_) {
+        qvSetOptionalParam(*encoder_->videoEncoder(encStreamNr_), "ccMode",
+                           static_cast<const AnyDict&>(source->params));
+        // It is read once a frame, whatever rate its own times are written at.
+        if (source->decoder != decoder_) qvSetOptionalParam(*source->decoder, "readRate", job_.inFramerate);
     }
-    qualitySetup_ = QvEncodingQualityStatsSetup(logs);
-    psnrLogger_ = std::make_unique<QvPSNRLogger>();
-    auto* muxer = encoder_->getMuxer();
-    const bool hasStream = muxer && encStreamNr_ < muxer->nrStreams(qvVideoStream);
-    auto* stream = hasStream ? muxer->stream(qvVideoStream, encStreamNr_) : nullptr;
-    if (psnrLogger_->startLogging(stream, qualitySetup_) == QvStatus::ok) return;
-    qvSetOptionalParam(encoder, "getQualityStats", 0);
-    qv_log()->error("Can not start logging.");
-    psnrLogger_.reset();
 }
-
-void TransVLink::writeLog() {
-    if (!psnrLogger_) return;
-    if (auto* encoder = encoder_->videoEncoder(encStreamNr_))
-        qvSetOptionalParam(*encoder, "getQualityStats", 0);
-    psnrLogger_->writeLog();
-    psnrLogger_->stopLogging();
-}
-
-void TransVLink::releasePipe() { videoPipe_.reset(); }
 
 int TransVLink::close() {
     if (!opened_) return QvStatus::ok;
-    writeLog();
-    psnrLogger_.reset();
+    if (qualityLog_) qualityLog_->finish(*encoder_, encStreamNr_);
+    qualityLog_.reset();
     const int result = videoPipe_ ? closePipe(*videoPipe_) : QvStatus::ok;
-    releasePipe();
+    videoPipe_.reset();
     qv_dbg()->debug("VLink @ %p: closed, %d frames written", static_cast<void*>(this), framesWritten_);
     framesWritten_ = -1;
     opened_ = false;
     return result;
 }
 
-double TransVLink::completed() const {
-    return nrFramesOut_ > 0 ? framesWritten_ * 100.0 / nrFramesOut_ : 0.0;
-}
+int TransVLink::totalOutFrames() const { return range_->out; }
+int TransVLink::nrFramesIn() const { return range_->in; }
+int TransVLink::startFrame() const { return range_->start; }
+int TransVLink::stopFrame() const { return range_->stop; }
+
+double TransVLink::completed() const { return range_->out > 0 ? framesWritten_ * 100.0 / range_->out : 0.0; }
 
 QvCodec* TransVLink::filter(const char* name, int index) const {
     return videoPipe_ ? videoPipe_->filter(name, index) : nullptr;
@@ -330,4 +263,142 @@ void TransVLink::log() {
     qv_dbg()->debug("---");
     qv_dbg()->debug("Processing:");
     for (int i = 0; i < videoPipe_->nrFilters(); ++i) logFilter(i + 1, *videoPipe_->filter(i));
+}
+
+// --- One step.
+
+int TransVLink::processFrame(int) {
+    QV_STEP_LOG("VLink", "processFrame");
+    Step step;
+    step.smart = smartRender_->isOn(*encoder_);
+    if (step.smart) {
+        smartStep(step);
+    } else {
+        if (videoPipe_)
+            pipeStep(step);
+        else
+            directStep(step);
+        if (step.frame) writeStep(step);
+    }
+    endStep(step);
+    ++framesWritten_;
+    if (finished_ && (step.frame || step.smart) && outProcessed() % 2 != 0) repeatLast(step);
+    // The frame was needed up to here.
+    if (videoPipe_ && step.frame) videoPipe_->next();
+    QV_STEP_LOG("VLink", "processFrame done, result=%d", step.write);
+    return step.write;
+}
+
+int TransVLink::writeFrame(QvFrame* frame) { return encoder_->writeFrame(frame, encStreamNr_); }
+
+void TransVLink::smartStep(Step& step) {
+    QV_STEP_LOG("VLink", "writeFrame (sr)...");
+    step.read = writeFrame(nullptr);
+    QV_STEP_LOG("VLink", "writeFrame (sr) done, result=%d", step.read);
+    if (framesWritten_ == 0) qvMakeStreamIcon(*encoder_, decoder_->getFramePtr(decStreamNr_));
+}
+
+void TransVLink::pipeStep(Step& step) {
+    if (videoPipe_->ready() == 0) {
+        QV_STEP_LOG("VLink", "vprocess...");
+        try {
+            step.read = _processOneFrame();
+        } catch (const QvAssertFailure& failure) {
+            pipeFailed(failure);
+            throw;
+        }
+        QV_STEP_LOG("VLink", "vprocess done, result=%d", step.read);
+        if (step.read == QvStatus::endOfStream) {
+            qv_dbg()->debug("VLink @ %p: End of input stream", static_cast<void*>(this));
+            step.read = QvStatus::ok;
+        }
+    }
+    if (videoPipe_->ready() > 0) step.frame = videoPipe_->frame();
+}
+
+void TransVLink::directStep(Step& step) {
+    QV_STEP_LOG("VLink", "readFrame...");
+    step.read = decoder_->readFrame(decStreamNr_);
+    QV_STEP_LOG("VLink", "readFrame done, result=%d", step.read);
+    if (step.read == QvStatus::endOfStream) {
+        qv_dbg()->debug("VLink @ %p: End of input stream", static_cast<void*>(this));
+        step.read = QvStatus::ok;
+        return;
+    }
+    if (step.read != QvStatus::ok) return;
+    step.frame = decoder_->getFramePtr(decStreamNr_);
+    feedMetaSources(step.frame);
+}
+
+void TransVLink::writeStep(Step& step) {
+    QV_STEP_LOG("VLink", "writeFrame no=%d...", step.frame->frameNr);
+    step.write = writeFrame(step.frame);
+    QV_STEP_LOG("VLink", "writeFrame done, result=%d", step.write);
+    if (step.write != QvStatus::ok) copyError(step.write, encoder_->videoEncoder(encStreamNr_)->errorDesc());
+    if (framesWritten_ == 0) qvMakeStreamIcon(*encoder_, step.frame);
+}
+
+void TransVLink::endStep(Step& step) {
+    const bool last = framesWritten_ >= range_->out - 1;
+    const bool nothing = !step.frame && !step.smart;
+    if (!nothing && !last && step.read == QvStatus::ok) return;
+    qv_dbg()->debug("VLink @ %p: Video processing done, frames out: %d (%d expected), frames in: %d.",
+                    static_cast<void*>(this), framesWritten_ + 1, range_->out, range_->in);
+    if (step.read != QvStatus::ok && !last) {
+        qv_dbg()->log(QvLogMask::error, "VLink @ %p: Read error \n", static_cast<void*>(this));
+        copyError(step.read, step.smart ? Any("Read error") : Any(decoder_->errorDesc()));
+        step.write |= step.read;
+    }
+    finished_ = true;
+}
+
+void TransVLink::repeatLast(Step& step) {
+    auto* encoder = encoder_->videoEncoder(encStreamNr_);
+    if (!encoder || !encoder->getParam("_needEven").isTrue()) return;
+    qv_log()->info("Repeating last frame to achieve even number (required by format)");
+    qvSetOptionalParam(*encoder, "_repeatingLast", 1);
+    step.write |= writeFrame(step.frame);
+    ++framesWritten_;
+}
+
+int TransVLink::_processOneFrame() {
+    int result = videoPipe_->process(nullptr, 0);
+    while (result == QvStatus::needsInput) {
+        const int read = decoder_->readFrame(decStreamNr_);
+        QvFrame* frame = read == QvStatus::endOfStream ? completePair() : nullptr;
+        if (read != QvStatus::ok && !frame) return read;
+        if (read == QvStatus::ok) {
+            frame = decoder_->getFramePtr(decStreamNr_);
+            if (!frame) return QvStatus::failed;
+            feedMetaSources(frame);
+        }
+        videoPipe_->write(*frame);
+        result = videoPipe_->process(nullptr, 0);
+    }
+    return result;
+}
+
+// Where a halving takes one frame more than the stream has, the last one serves twice; otherwise null.
+QvFrame* TransVLink::completePair() {
+    if (!range_->pairCompleted || static_cast<int>(videoPipe_->framesIn()) + 1 != range_->in) return nullptr;
+    QvFrame* last = decoder_->getFramePtr(decStreamNr_);
+    if (!last || !last->inited() || last->frameNr < 0) return nullptr;
+    ++last->frameNr;
+    last->clearUserData();
+    last->clearSubpic();
+    return last;
+}
+
+// A frame carries the captions of its own time, or none.
+void TransVLink::feedMetaSources(QvFrame* frame) {
+    if (!frame) return;
+    for (const auto& source : metaSources_) {
+        if (source->decoder != decoder_ || source->stream != decStreamNr_)
+            source->decoder->readFrame(source->stream);
+        AnyDict captions;
+        if (source->decoder->readMeta(source->stream, 0, captions) == QvStatus::ok)
+            frame->setSubpic(captions);
+        else
+            frame->clearSubpic();
+    }
 }

@@ -15,7 +15,8 @@
 #include "core/engine/status.h"
 #include "core/engine/threads/qvthreads.h"
 #include "core/stream/qvbufstrm.h"
-#include "core/transcode/link/translink.h"
+#include "core/transcode/link/transalink.h"
+#include "core/transcode/link/transvlink.h"
 #include "core/transcode/push/pushfeed_p.h"
 #include "core/transcode/push/pushinput_p.h"
 

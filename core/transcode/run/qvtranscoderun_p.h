@@ -84,7 +84,7 @@ class QvTranscodeRun {
     // main loop
     void videoTurn();
     void audioTurn();
-    int audioDue(TransLink& link) const;
+    int audioDue(const TransLink& audio) const;
     void link(TransLink& link, int n);
     void waitWhilePaused();
     void report(QvProgressReport& progress);

@@ -16,7 +16,7 @@
 #include "core/engine/threads/qvtimer.h"
 #include "core/preset/qvpreset.h"
 #include "core/stream/nav/qvmetadatafile.h"
-#include "core/transcode/link/translink.h"
+#include "core/transcode/link/transvlink.h"
 #include "core/transcode/run/qvtranscoderun_p.h"
 
 namespace {

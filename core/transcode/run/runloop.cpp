@@ -170,8 +170,8 @@ int QvTranscodeRun::postprocess(const Any& command) {
 int QvTranscodeRun::mainLoop() {
     const auto links = p_.task->links();
     for (int i = 0; i < links.size(); ++i)
-        (links.at(i)->type() == 1 ? video_ : audio_).push_back(links.at(i));
-    rate_ = video_.empty() ? QvFramerate::f24p() : static_cast<TransVLink*>(video_.front())->outFramerate();
+        (links.at(i)->type() == qvVideoStream ? video_ : audio_).push_back(links.at(i));
+    rate_ = video_.empty() ? QvFramerate::f24p() : video_.front()->outFramerate();
     double reportRate = 0;
     const int total = totalFrames(*p_.task, reportRate);
     QvProgressReport progress(p_.progress, total, reportRate);
@@ -228,15 +228,13 @@ void QvTranscodeRun::audioTurn() {
         link(*audio, audioDue(*audio));
         if (result_ == QvStatus::ok && before != QvStatus::ok) result_ = before;
         // Sound of no length is never asked for anything, so it can't tell that it has finished.
-        const auto& sound = static_cast<const TransALink&>(*audio);
-        const bool complete = sound.finished() || sound.outProcessed() >= sound.totalOutSamples();
+        const bool complete = audio->finished() || audio->outProcessed() >= audio->totalOutSamples();
         if (video_.empty()) allDone_ = allDone_ && complete;
     }
 }
 
 // The synchronisation rule: the samples of all frames written so far, less those that are written.
-int QvTranscodeRun::audioDue(TransLink& link) const {
-    auto& audio = static_cast<TransALink&>(link);
+int QvTranscodeRun::audioDue(const TransLink& audio) const {
     const long long frames = video_.empty() ? rounds_ + 1 : framesDone_;
     long long due = 0;
     if (frames != 0) due = audio.outSamplesPerFrames(static_cast<int>(frames), rate_) - audio.outProcessed();

@@ -12,7 +12,8 @@
 #include "core/engine/log/qvlog.h"
 #include "core/engine/status.h"
 #include "core/stream/qvbufstrm.h"
-#include "core/transcode/link/translink.h"
+#include "core/transcode/link/transalink.h"
+#include "core/transcode/link/transvlink.h"
 
 namespace {
 

@@ -1,6 +1,6 @@
+#include "core/transcode/link/transalink.h"
 #include "builtin/modules.h"
 #include "core/filter/qvprocesspipe.h"
-#include "core/transcode/link/translink.h"
 #include "tests/support/checks.h"
 #include "tests/support/fake_filters.h"
 #include "tests/support/fake_streams.h"

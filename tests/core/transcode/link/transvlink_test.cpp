@@ -2,7 +2,7 @@
 
 #include "builtin/modules.h"
 #include "core/filter/qvprocesspipe.h"
-#include "core/transcode/link/translink.h"
+#include "core/transcode/link/transvlink.h"
 #include "tests/support/checks.h"
 #include "tests/support/fake_filters.h"
 #include "tests/support/fake_streams.h"
@@ -246,6 +246,30 @@ TEST(TransVLink, SmartRenderingSendsNoFrames) {
     EXPECT_EQ(job.run(), 0);
     EXPECT_EQ(job.encoder.video.addresses, std::vector<QvFrame*>(3, nullptr));
     EXPECT_EQ(job.decoder.read, 0);
+}
+
+// Encoders may pass some frames and encode others; one that knows nothing of it is asked in the first step.
+TEST(TransVLink, EachFrameIsPassedOrEncodedAsTheEncoderSays) {
+    SmartJob job;
+    ASSERT_EQ(job.open(), 0);
+    for (const int on : {0, 1, 0}) {
+        job.encoder.video.params.set("smartRenderingOn", on);
+        EXPECT_EQ(job.link.processFrame(0), 0);
+        EXPECT_EQ(job.encoder.video.addresses.back() == nullptr, on == 1);
+    }
+    for (const bool knows : {true, false}) {
+        Job plain(6);
+        ASSERT_EQ(plain.open(), 0);
+        if (knows) plain.encoder.video.params.set("smartRender", 1);
+        EXPECT_EQ(plain.link.processFrame(0), 0);
+        plain.encoder.video.params.set("smartRenderingOn", 1);
+        EXPECT_EQ(plain.link.processFrame(0), 0);
+        EXPECT_EQ(plain.encoder.video.addresses.back() == nullptr, knows);
+        plain.link.close();
+        ASSERT_EQ(plain.open(), 0);
+        EXPECT_EQ(plain.link.processFrame(0), 0);
+        EXPECT_EQ(plain.encoder.video.addresses.back(), nullptr) << "the next run asks again";
+    }
 }
 
 TEST(TransVLink, WhatBarsSmartRendering) {
