@@ -1,15 +1,14 @@
-// The first pass of a two-pass run: each video encoder that wants statistics encodes into nothing, through
-// a private pipe, while a metadata file collects what it learns.
+#include "core/transcode/run/firstpass_p.h"
+
 #include <cstdio>
-#include <memory>
 #include <string>
-#include <string_view>
 
 #include "core/arch/qvassert.h"
 #include "core/decode/qvdecoder.h"
 #include "core/encode/qvencodepipe.h"
 #include "core/encode/qvencoder.h"
 #include "core/engine/log/qvlog.h"
+#include "core/engine/modules/moduletraits_p.h"
 #include "core/engine/modules/qvregistry.h"
 #include "core/engine/qvutil.h"
 #include "core/engine/status.h"
@@ -17,7 +16,12 @@
 #include "core/preset/qvpreset.h"
 #include "core/stream/nav/qvmetadatafile.h"
 #include "core/transcode/link/transvlink.h"
-#include "core/transcode/run/qvtranscoderun_p.h"
+#include "core/transcode/run/qvprogressreport_p.h"
+#include "core/transcode/run/runcontrol_p.h"
+#include "core/transcode/run/runlinks_p.h"
+#include "core/transcode/run/steptimes_p.h"
+#include "core/transcode/run/transcodersettings_p.h"
+#include "core/transcode/task/qvtranscodetask.h"
 
 namespace {
 
@@ -35,35 +39,28 @@ Any statisticsName(const Any& base, int index) {
 
 }  // namespace
 
-// The private pipe, and its links with the real link that each stands for.
-struct QvTranscodeRun::FirstPass {
-    struct Link {
-        std::unique_ptr<TransVLink> twin;
-        TransLink* real;
-    };
-    std::unique_ptr<QvEncodePipe> pipe;
-    std::vector<Link> links;
-};
+FirstPass::FirstPass(const RunContext& run) : run_(run) {}
 
-int QvTranscodeRun::analyze() {
-    p_.firstPassRunning = true;
+FirstPass::~FirstPass() = default;
+
+int FirstPass::run() {
+    run_.control.firstPass = true;
     qv_dbg()->debug("Transcoder: Starting first (analyze) pass");
     TPtrList<TransLink> wanted;
-    if (p_.task->checkMultiPass(&wanted) == 0) {
+    if (run_.task.checkMultiPass(&wanted) == 0) {
         qv_dbg()->warning("Transcoder: Two pass encoding not possible, reverting to single pass.");
         return QvStatus::ok;
     }
-    QV_ASSERT(p_.metadataFiles.empty());
-    FirstPass pass;
-    if (makeFirstPass(wanted, pass) != QvStatus::ok || pass.pipe->open() != QvStatus::ok) {
-        qv_dbg()->log(2, "First (analyze) pass error");
+    QV_ASSERT(run_.statistics.empty());
+    if (make(wanted) != QvStatus::ok || pipe_->open() != QvStatus::ok) {
+        qv_dbg()->log(QvLogMask::error, "First (analyze) pass error");
         return QvStatus::failed;
     }
-    int result = runFirstPass(pass);
-    const int closed = pass.pipe->close();  // encoders may write the last of their statistics here
+    int result = loop();
+    const int closed = pipe_->close();  // encoders may write the last of their statistics here
     if (result == QvStatus::ok) result = closed;
-    result |= endFirstPass(pass);
-    p_.firstPassRunning = false;
+    result |= end();
+    run_.control.firstPass = false;
     if (result == QvStatus::ok)
         qv_log()->info("First (analyze) pass OK.");
     else
@@ -71,27 +68,28 @@ int QvTranscodeRun::analyze() {
     return result;
 }
 
-int QvTranscodeRun::makeFirstPass(const TPtrList<TransLink>& wanted, FirstPass& pass) {
-    const Any base = p_.metaName.isTrue() ? p_.metaName : QvUtil::makeMetaName(qv_registry()->tempDir());
-    QvEncodePipe& real = *p_.task->encoder();
-    pass.pipe.reset(QvEncodePipe::create());
-    if (!pass.pipe) return QvStatus::failed;
-    QvEncodePipe& pipe = *pass.pipe;
+int FirstPass::make(const TPtrList<TransLink>& wanted) {
+    const Any base = run_.settings.metaName.isTrue() ? run_.settings.metaName
+                                                     : QvUtil::makeMetaName(qv_registry()->tempDir());
+    QvEncodePipe& real = *run_.task.encoder();
+    pipe_.reset(QvEncodePipe::create());
+    if (!pipe_) return QvStatus::failed;
+    QvEncodePipe& pipe = *pipe_;
     if (const QvPreset* preset = real.activePreset()) pipe.applyPreset(preset->profile(), 0);
     pipe.removeStreams(qvAllStreams);
     pipe.setMuxer("nullmux");
     pipe.setFilename(Any(""));
 
     AnyVector params;
-    QvTask::makeOpenParams(*p_.task, wanted, params);
+    QvTask::makeOpenParams(run_.task, wanted, params);
     for (int i = 0; i < wanted.size(); ++i) {
         TransLink& link = *wanted.at(i);
         QvVideoEncoder& encoder = *real.videoEncoder(link.encStreamNr());
         AnyDict settings, stream;
         encoder.store(settings);
-        p_.metadataFiles.push_back(std::make_unique<QvMetadataFile>());
-        QvMetadataFile& file = *p_.metadataFiles.back();
-        file.init(statisticsName(base, i), std::string_view(encoder.name()) == "divxvenc");
+        run_.statistics.push_back(std::make_unique<QvMetadataFile>());
+        QvMetadataFile& file = *run_.statistics.back();
+        file.init(statisticsName(base, i), qvModuleTraits(encoder).ownStatistics);
         stream.set("codec", encoder.name());
         QV_ASSERT_MSG(pipe.addVideoStream(stream) >= 0, "Transcoder._analyze: failed to add stream");
         QvVideoEncoder& twin = *pipe.videoEncoder(i);
@@ -99,8 +97,8 @@ int QvTranscodeRun::makeFirstPass(const TPtrList<TransLink>& wanted, FirstPass& 
         twin.setParam("meta", statisticsOf(file));
         twin.setParam("firstPass", Any(1));
 
-        pass.links.push_back({std::make_unique<TransVLink>(), &link});
-        TransVLink& made = *pass.links.back().twin;
+        links_.push_back({std::make_unique<TransVLink>(), &link});
+        TransVLink& made = *links_.back().twin;
         if (made.init(link.decoder(), link.decStreamNr(), &pipe, i) != QvStatus::ok) return QvStatus::failed;
         pipe.videoStream(i)->setEnabled(true);
         if (made.open(&params.at(i).asDict()) != QvStatus::ok) return QvStatus::failed;
@@ -108,46 +106,46 @@ int QvTranscodeRun::makeFirstPass(const TPtrList<TransLink>& wanted, FirstPass& 
     return QvStatus::ok;
 }
 
-int QvTranscodeRun::runFirstPass(FirstPass& pass) {
+int FirstPass::loop() {
     double rate = 0;
-    const int total = totalFrames(*p_.task, rate);
-    QvProgressReport progress(p_.progress, total, rate);
+    const int total = qvrunlinks::totalFrames(run_.task, rate);
+    QvProgressReport progress(run_.settings.progress, total, rate);
     progress.setPass(0, 0.5);
-    callProgress(0);
+    run_.callProgress(0);
     int result = QvStatus::ok;
-    p_.times.begin(QvTimer::time());
-    for (bool done = false; !done && !stopping();) {
+    run_.times.begin(QvTimer::time());
+    for (bool done = false; !done && !run_.control.stopping();) {
         done = true;
-        for (FirstPass::Link& link : pass.links) {
+        for (Link& link : links_) {
             if (link.twin->finished()) continue;
             result = link.twin->processFrame(0);
-            p_.times.step(QvTimer::time());
+            run_.times.step(QvTimer::time());
             if (result != QvStatus::ok) {
-                stopLoop();
+                run_.control.stopLoop();
                 break;
             }
             done = done && link.twin->finished();
         }
         double part = 0;
-        if (progress.due(QvTimer::time(), part) && !stopping()) callProgress(part);
-        callProcess();
-        if (!stopping()) waitWhilePaused();
+        if (progress.due(QvTimer::time(), part) && !run_.control.stopping()) run_.callProgress(part);
+        run_.callProcess();
+        if (!run_.control.stopping()) run_.waitWhilePaused();
     }
     return result;
 }
 
 // The real encoders take the statistics, and the inputs go back to where they were.
-int QvTranscodeRun::endFirstPass(const FirstPass& pass) {
+int FirstPass::end() {
     int result = QvStatus::ok;
-    for (size_t i = 0; i < pass.links.size(); ++i) {
-        TransLink& link = *pass.links[i].real;
-        if (!stopping())
-            p_.task->encoder()
+    for (size_t i = 0; i < links_.size(); ++i) {
+        TransLink& link = *links_[i].real;
+        if (!run_.control.stopping())
+            run_.task.encoder()
                 ->videoEncoder(link.encStreamNr())
-                ->setParam("meta", statisticsOf(*p_.metadataFiles[i]));
+                ->setParam("meta", statisticsOf(*run_.statistics[i]));
         const MediaTime in = link.inPoint();
         qv_dbg()->debug("Analyze, seeking stream %d to %f seconds", link.decStreamNr(), in.seconds());
-        result |= link.decoder()->seek(in, 1, link.decStreamNr());
+        result |= link.decoder()->seek(in, qvVideoStream, link.decStreamNr());
     }
     return result;
 }

@@ -1,5 +1,5 @@
-// The start of a run: from a task with links to open inputs, links and output.
-#include <new>
+#include "core/transcode/run/runopening_p.h"
+
 #include <string>
 
 #include "core/arch/qvassert.h"
@@ -16,11 +16,13 @@
 #include "core/preset/qvpreset.h"
 #include "core/preset/qvpresetmgr.h"
 #include "core/transcode/link/translink.h"
-#include "core/transcode/run/qvtranscoderun_p.h"
+#include "core/transcode/run/runcontrol_p.h"
+#include "core/transcode/run/runerror_p.h"
+#include "core/transcode/run/runlinks_p.h"
+#include "core/transcode/run/transcodersettings_p.h"
+#include "core/transcode/task/qvtranscodetask.h"
 
 namespace {
-
-constexpr double kFilmRate = 24.0;
 
 std::string narrow(const Any& value) {
     const Any text = value.isWString() ? value.toString() : value;
@@ -29,11 +31,10 @@ std::string narrow(const Any& value) {
 
 }  // namespace
 
-int QvTranscodeRun::open() {
-    QvEncodePipe* pipe = p_.task->encoder();
+int RunOpening::open() {
+    QvEncodePipe* pipe = run_.task.encoder();
     QV_ASSERT_MSG(pipe, "Transcoder.transcode: Encoder not set!");
-    p_.errorCode = QvStatus::ok;
-    p_.errorText.clear();
+    run_.error.clear();
     collectParams();
     beginLogFile();
     int warning = QvStatus::ok;
@@ -43,7 +44,7 @@ int QvTranscodeRun::open() {
     if (result == QvStatus::ok) {
         setMuxerLength();
         copyMeta();
-        if (!p_.twoPass) result = openEncoder();
+        if (!run_.settings.twoPass) result = openEncoder();
         logSettings();
         if (result != QvStatus::ok) copyPipeError(result);
     }
@@ -52,133 +53,100 @@ int QvTranscodeRun::open() {
 }
 
 // The transcoder's global parameters become those of the task.
-void QvTranscodeRun::collectParams() {
+void RunOpening::collectParams() {
     ProcessParams audio, video;
-    if (p_.smartRender) {
+    if (run_.settings.smartRender) {
         audio.setSmartRender(1);
-        if (!p_.twoPass) video.setSmartRender(1);
+        if (!run_.settings.twoPass) video.setSmartRender(1);
     }
-    if (!p_.connMatrix.empty()) audio.set("audioChannelMap", p_.connMatrix);
-    if (!p_.audioEffects.empty()) audio.set("filters", p_.audioEffects);
-    if (!p_.effects.empty()) video.set("filters", p_.effects);
-    if (!p_.chapters.empty()) video.set("chapters", p_.chapters);
-    p_.task->setProcessParams(audio, 2);
-    p_.task->setProcessParams(video, 1);
+    if (!run_.settings.connMatrix.empty()) audio.setAudioChannelMap(run_.settings.connMatrix);
+    if (!run_.settings.audioEffects.empty()) audio.setFilters(run_.settings.audioEffects);
+    if (!run_.settings.effects.empty()) video.setFilters(run_.settings.effects);
+    if (!run_.settings.chapters.empty()) video.setChapterPoints(run_.settings.chapters);
+    run_.task.setProcessParams(audio, qvAudioStream);
+    run_.task.setProcessParams(video, qvVideoStream);
 }
 
-void QvTranscodeRun::beginLogFile() {
+void RunOpening::beginLogFile() {
     Any name;
-    if (p_.writeLogfile) {
-        const std::string file = narrow(p_.task->encoder()->getFilename());
+    if (run_.settings.writeLogfile) {
+        const std::string file = narrow(run_.task.encoder()->getFilename());
         if (!file.empty()) name = Any((file + ".log").c_str());
     }
     if (name.isTrue()) qv_dbg()->debug("Transcoder: Logging to %s", name.asString());
     qv_log()->setLogFile(name);
 }
 
-int QvTranscodeRun::checkTask(int& warning) {
+int RunOpening::checkTask(int& warning) {
     AnyVector messages;
-    const int legal = p_.task->checkLegal(messages);
+    const int legal = run_.task.checkLegal(messages);
     if (legal == QvStatus::notLegal || legal == QvStatus::warning) {
         const Any text = messages.join(Any("\n"));
-        t_.setError(legal, "%s", text.isString() ? text.asString() : "");
+        run_.error.set(legal, "%s", text.isString() ? text.asString() : "");
         if (legal == QvStatus::notLegal) return legal;
         warning = legal;
     }
-    if (p_.task->checkStreams() != QvStatus::ok)
-        return t_.setError(QvStatus::failed, "%s", p_.task->errorDesc());
+    if (run_.task.checkStreams() != QvStatus::ok)
+        return run_.error.set(QvStatus::failed, "%s", run_.task.errorDesc());
     return QvStatus::ok;
 }
 
-int QvTranscodeRun::openLinks() {
+int RunOpening::openLinks() {
     AnyVector params;
-    const auto links = p_.task->links();
-    QvTask::makeOpenParams(*p_.task, links, params);
-    closeLinks(*p_.task);  // a run that could not start leaves some open
+    const auto links = run_.task.links();
+    QvTask::makeOpenParams(run_.task, links, params);
+    qvrunlinks::close(run_.task);  // a run that could not start leaves some open
     for (int i = 0; i < links.size(); ++i) {
         TransLink& link = *links.at(i);
         int result = QvStatus::failed;
         try {
             result = link.open(&params.at(i).asDict());
         } catch (const QvAssertFailure&) {
-            t_.setError(QvStatus::failed, "Can not open transcode link");
+            run_.error.set(QvStatus::failed, "Can not open transcode link");
             throw;
         }
         if (result == QvStatus::ok) continue;
-        // The failed link is closed once for each one before it; those stay open until the next run.
-        for (int k = 0; k < i; ++k) link.close();
-        return t_.setError(QvStatus::failed, "Can not open transcode link");
+        // The links before it stay open until the next run.
+        return run_.error.set(QvStatus::failed, "Can not open transcode link");
     }
     return QvStatus::ok;
 }
 
-int QvTranscodeRun::seekInputs() {
-    const auto links = p_.task->links();
+int RunOpening::seekInputs() {
+    const auto links = run_.task.links();
     for (int i = 0; i < links.size(); ++i) {
         TransLink& link = *links.at(i);
         const MediaTime in = link.inPoint();
         if (link.decoder()->seek(in, link.type(), link.decStreamNr()) != QvStatus::ok) {
-            closeLinks(*p_.task);
-            return t_.setError(QvStatus::failed, "Seek input %s #%d to %f failed, aborting",
-                               QvTask::typeName(link.type()), link.decStreamNr(), in.seconds());
+            qvrunlinks::close(run_.task);
+            return run_.error.set(QvStatus::failed, "Seek input %s #%d to %f failed, aborting",
+                                  QvTask::typeName(link.type()), link.decStreamNr(), in.seconds());
         }
-        for (int k = 0; link.type() == 1 && k < link.nrMetaSources(); ++k) {
+        for (int k = 0; link.type() == qvVideoStream && k < link.nrMetaSources(); ++k) {
             QvDecodePipe* meta = link.metaSource(k);
             if (meta != link.decoder())
-                meta->seek(in, meta->nrStreams(1) > 0 ? 1 : 4, link.metaSourceStreamNr(k));
+                meta->seek(in, meta->nrStreams(qvVideoStream) > 0 ? qvVideoStream : qvSubpicStream,
+                           link.metaSourceStreamNr(k));
         }
     }
     return QvStatus::ok;
 }
 
-int QvTranscodeRun::closeLinks(const QvTask& task) {
-    int result = QvStatus::ok;
-    for (int i = 0; i < task.nrLinks(); ++i) {
-        try {
-            result |= task.getLink(i)->close();
-        } catch (const std::bad_alloc&) {
-            result |= QvStatus::outOfMemory;
-        } catch (const QvException& failure) {
-            qv_dbg()->error("Transcoder: %s", failure.what());
-            result |= QvStatus::failed;
-        }
-    }
-    return result;
-}
-
-int QvTranscodeRun::totalFrames(const QvTask& task, double& rate) {
-    rate = kFilmRate;
-    QvEncodePipe* pipe = task.encoder();
-    if (pipe && pipe->nrStreams(1) > 0) {
-        const Any value = pipe->QvCodec::getParam("video0/framerate");
-        if (value.isFramerate()) rate = value.asFramerate().rate();
-    }
-    const auto links = task.links();
-    int total = 0;
-    if (!links.empty() && links.at(0)->type() == 1) total = links.at(0)->totalOutFrames();
-    if (total != 0) return total;
-    for (int i = 0; i < links.size(); ++i) {
-        const MediaTime length = links.at(i)->outPoint() - links.at(i)->inPoint();
-        total = std::max(total, static_cast<int>(length.position(24)));
-    }
-    return total;
-}
-
 // A multiplexer that numbers its files has to know how many digits they need.
-void QvTranscodeRun::setMuxerLength() {
+void RunOpening::setMuxerLength() {
     double rate = 0;
-    const int total = totalFrames(*p_.task, rate);
-    if (QvMuxer* muxer = p_.task->encoder()->getMuxer(); muxer && total > 0)
+    const int total = qvrunlinks::totalFrames(run_.task, rate);
+    if (QvMuxer* muxer = run_.task.encoder()->getMuxer(); muxer && total > 0)
         qvSetOptionalParam(*muxer, "_totalFrames", Any(total));
 }
 
-void QvTranscodeRun::copyMeta() {
-    const TransLink* video = p_.task->getLink(1, 0);
+void RunOpening::copyMeta() {
+    const TransLink* video = run_.task.getLink(qvVideoStream, 0);
     if (!video) return;
     const Any meta = video->decoder()->QvCodec::getParam("meta");
     if (!meta.isDict()) return;
-    QvMuxer* muxer = p_.task->encoder()->getMuxer();
-    QvVideoEncoder* encoder = p_.task->encoder()->videoEncoder(video->encStreamNr());
+    QvMuxer* muxer = run_.task.encoder()->getMuxer();
+    QvVideoEncoder* encoder = run_.task.encoder()->videoEncoder(video->encStreamNr());
     if (muxer) qvSetOptionalParam(*muxer, "meta", meta);
     const Any start = meta.asDict().get("startTimecode");
     const Any rate = encoder ? encoder->QvCodec::getParam("framerate") : Any();
@@ -188,26 +156,23 @@ void QvTranscodeRun::copyMeta() {
     if (muxer) qvSetOptionalParam(*muxer, "timecodeOffset", offset);
 }
 
-int QvTranscodeRun::openEncoder() {
-    QvEncodePipe& pipe = *p_.task->encoder();
-    if (pipe.getState() == 3) return QvStatus::ok;
-    pipe.setCancel(p_.cancel);
+int RunOpening::openEncoder() {
+    QvEncodePipe& pipe = *run_.task.encoder();
+    if (pipe.getState() == QvDecodePipe::stateOpen) return QvStatus::ok;
+    pipe.setCancel(run_.control.cancel());
     const int result = pipe.open();
     if (result == QvStatus::ok) return result;
     pipe.setCancel(nullptr);
-    closeLinks(*p_.task);
+    qvrunlinks::close(run_.task);
     return pipe.errorCode() ? pipe.errorCode() : result;
 }
 
 // The pipe has logged it.
-void QvTranscodeRun::copyPipeError(int code) {
-    p_.errorCode = code;
-    p_.errorText = p_.task->encoder()->errorDesc();
-}
+void RunOpening::copyPipeError(int code) { run_.error.copy(code, run_.task.encoder()->errorDesc()); }
 
-void QvTranscodeRun::logSettings() const {
+void RunOpening::logSettings() const {
     QvDbgLog& log = *qv_dbg();
-    const QvEncodePipe* pipe = p_.task->encoder();
+    const QvEncodePipe* pipe = run_.task.encoder();
     if (!pipe) {
         log.debug("No encoder?");
         log.debug("================");
@@ -229,7 +194,7 @@ void QvTranscodeRun::logSettings() const {
     else
         log.debug("Muxer: n/a");
     log.debug("Stream map:");
-    p_.task->debugOutLinks();
+    run_.task.debugOutLinks();
     for (const char* line : {"--------", "Settings", "--------"}) log.debug("%s", line);
     if (muxer) {
         AnyDict settings;
@@ -237,7 +202,7 @@ void QvTranscodeRun::logSettings() const {
         log.debug("Muxer:");
         QvUtil::debugOutDict(settings);
     }
-    const auto links = p_.task->links();
+    const auto links = run_.task.links();
     for (int i = 0; i < links.size(); ++i) links.at(i)->log();
     log.debug("================");
 }
