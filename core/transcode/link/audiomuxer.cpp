@@ -94,7 +94,7 @@ void AudioMuxer::setPassthrough() {
     for (int i = 0; i < outChannels_; ++i) matrix_.append(AnyVector());
     qvchannels::Layout layout;
     layout.codec = decCodec_.asString("");
-    layout.encoder = encName_.asString("");
+    if (encoder_) layout.target = qvModuleTraits(*encoder_).family;
     layout.inChannels = inChannels_;
     layout.outChannels = outChannels_;
     const Any dolby = decoder_ ? streamParam(*decoder_, decStream_, "dolby") : Any();

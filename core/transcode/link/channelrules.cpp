@@ -10,13 +10,6 @@ namespace {
 
 using Connections = std::vector<Connection>;
 
-enum class Target { dolby, aac, other };
-
-Target targetOf(std::string_view encoder) {
-    if (encoder == "ddaenc" || encoder == "ddproaenc" || encoder == "ddplusproaenc") return Target::dolby;
-    return encoder == "aacaenc" ? Target::aac : Target::other;
-}
-
 Connections straight(int count) {
     Connections list;
     for (int i = 0; i < count; ++i) list.push_back({i, i});
@@ -71,11 +64,11 @@ constexpr Places all(const Place (&places)[N]) {
     return {places, places + N};
 }
 
-Places dolbyPlaces(Target target, int out) {
+Places dolbyPlaces(CodecFamily target, int out) {
     if (out == 1) return all(any1);
     if (out == 2) return all(any2);
-    if (target == Target::other) return {};
-    const bool dolby = target == Target::dolby;
+    if (target != CodecFamily::dolby && target != CodecFamily::aac) return {};
+    const bool dolby = target == CodecFamily::dolby;
     switch (out) {
         case 3: return dolby ? all(dolby3) : all(aac3);
         case 4: return dolby ? all(dolby4) : all(aac4);
@@ -85,7 +78,7 @@ Places dolbyPlaces(Target target, int out) {
     }
 }
 
-Connections fromDolby(const Layout& layout, Target target) {
+Connections fromDolby(const Layout& layout, CodecFamily target) {
     const Places places = dolbyPlaces(target, layout.outChannels);
     if (!places.begin) return byDefault(layout.inChannels, layout.outChannels);
     Connections list;
@@ -160,13 +153,13 @@ Connections otherToDolby(int in, int out) {
 std::vector<Connection> connections(const Layout& layout) {
     const int in = layout.inChannels;
     const int out = layout.outChannels;
-    const Target target = targetOf(layout.encoder);
+    const CodecFamily target = layout.target;
     if (layout.codec == "AAC") {
-        if (target == Target::dolby) return aacToDolby(in, out);
-        return target == Target::aac ? aacToAac(in, out) : aacToOther(in, out);
+        if (target == CodecFamily::dolby) return aacToDolby(in, out);
+        return target == CodecFamily::aac ? aacToAac(in, out) : aacToOther(in, out);
     }
     if (layout.codec == "Dolby") return layout.dolby ? fromDolby(layout, target) : byDefault(in, out);
-    return target == Target::dolby ? otherToDolby(in, out) : byDefault(in, out);
+    return target == CodecFamily::dolby ? otherToDolby(in, out) : byDefault(in, out);
 }
 
 }  // namespace qvchannels

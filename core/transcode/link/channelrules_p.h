@@ -5,6 +5,8 @@
 #include <string_view>
 #include <vector>
 
+#include "core/engine/modules/moduletraits_p.h"
+
 class AnyDict;
 
 namespace qvchannels {
@@ -16,8 +18,8 @@ struct Connection {
 };
 
 struct Layout {
-    std::string_view codec;          // the source stream's
-    std::string_view encoder;        // the target's module name
+    std::string_view codec;                  // the source stream's
+    CodecFamily target = CodecFamily::none;  // of the encoder
     const AnyDict* dolby = nullptr;  // positions of "L", "R", "C", "Ls", "Rs", "SUB" in a Dolby source
     int inChannels = 0;
     int outChannels = 0;
