@@ -6,8 +6,6 @@
 
 #include <string_view>
 
-#include "core/arch/api.h"
-
 class QvCodec;
 class QvModule;
 
@@ -32,5 +30,5 @@ struct ModuleTraits {
 };
 
 // `module` may be null for a codec without one; then the name alone decides.
-QV_API ModuleTraits qvModuleTraits(std::string_view name, const QvModule* module);
-QV_API ModuleTraits qvModuleTraits(const QvCodec& codec);
+ModuleTraits qvModuleTraits(std::string_view name, const QvModule* module);
+ModuleTraits qvModuleTraits(const QvCodec& codec);

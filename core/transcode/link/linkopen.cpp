@@ -7,9 +7,11 @@ LinkOpen::LinkOpen(const AnyDict* params) {
         points = InOutPoints(given);
     chapters = params->getVector("chapters");
     effects = params->getDict("effects");
-    audioFilters = params->getDict("audioEffects").getVector("customFilters");
+    takeAudioEffects(params->getDict("audioEffects"));
     connMatrix = params->getVector("connMatrix");
     qualityStats = params->getVector("qualityStats");
     smartRender = params->getInt32("smartRender", 0);
     passPicture = params->get("smartRender").isTrue();
 }
+
+void LinkOpen::takeAudioEffects(const AnyDict& filters) { audioFilters = filters.getVector("customFilters"); }

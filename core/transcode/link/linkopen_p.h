@@ -11,6 +11,7 @@ struct LinkOpen {
     // "inOutPoints", "chapters", "effects", "audioEffects", "connMatrix", "smartRender", "qualityStats"; what
     // is absent or of another type counts as not given. Null gives nothing.
     explicit LinkOpen(const AnyDict* params);
+    void takeAudioEffects(const AnyDict& filters);  // a FiltersState
 
     bool frameNumbers = false;          // "startFrame" or "stopFrame", which are refused
     std::optional<InOutPoints> points;  // at least one pair

@@ -63,7 +63,6 @@ class SampleBuffer {
 
 // The part that both kinds of stream have.
 struct PushStream {
-    AnyDict params;
     ProcessParams process;
     bool end = false;                  // under the lock of its kind
     std::atomic<bool> waiting{false};  // the worker is, for this stream
