@@ -31,7 +31,7 @@ Connections byDefault(int in, int out) {
     return list;
 }
 
-// --- Dolby sources tell where each speaker lies.
+// --- Dolby sources give the position of each speaker.
 
 enum Speaker { L, R, C, Ls, Rs, SUB, nrSpeakers };
 

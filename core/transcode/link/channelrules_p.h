@@ -1,5 +1,5 @@
-// Which input channel feeds which output channel when nobody says: rules by source codec, encoder and channel
-// counts. Internal to this folder.
+// Which input channel feeds which output channel when the job does not say: rules by source codec, encoder
+// and channel counts. Internal to this folder.
 #pragma once
 
 #include <string_view>

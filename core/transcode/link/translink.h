@@ -36,7 +36,7 @@ class QV_API TransLink {
     // already.
     virtual int open(const AnyDict* params);
     // Ends the run. A closed link is left alone: 0. Otherwise 0 or what a filter failed with since open, here
-    // or before: filters let frames pass that they could not work on, and no step tells.
+    // or before: filters let frames pass that they could not work on, and no step reports it.
     virtual int close() = 0;
     // One step: a frame for video, exactly n samples for audio. The status of the writer, or of the reader
     // when it failed before the expected end.

@@ -176,16 +176,16 @@ void TransVLink::_setTotalVDuration() {
         return std::max(1, videoPipe_->filter(i)->getParam("_rateFactor").asInt32(1));
     };
     const int filters = videoPipe_->nrFilters();
-    long long total = range_->in, behind = 1;  // `behind`: frames that later filters make of one
-    for (int i = 0; i < filters; ++i) behind *= factor(i);
+    long long total = range_->in, later = 1;  // `later`: frames that the filters to come make of one
+    for (int i = 0; i < filters; ++i) later *= factor(i);
     for (int i = 0; i < filters; ++i) {
         auto& filter = *videoPipe_->filter(i);
         if (filter.getParam("_isFramerateConverter").isTrue())
-            total = range_->out / behind;
+            total = range_->out / later;
         else
             qvSetOptionalParam(filter, "_totalFrames", static_cast<int>(total));
         total *= factor(i);
-        behind /= factor(i);
+        later /= factor(i);
     }
 }
 

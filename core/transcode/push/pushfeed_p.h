@@ -44,7 +44,7 @@ class FrameBuffer {
     QvFramerate rate_;
 };
 
-// Samples of one format, one behind the other.
+// Samples of one format, in the order in which they came.
 class SampleBuffer {
   public:
     int init(int capacity, int sampleBytes);

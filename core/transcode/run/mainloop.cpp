@@ -66,7 +66,7 @@ void MainLoop::audioTurn() {
         const int before = result_;
         link(*audio, audioDue(*audio));
         if (result_ == QvStatus::ok && before != QvStatus::ok) result_ = before;
-        // Sound of no length is never asked for anything, so it can't tell that it has finished.
+        // An audio link without samples is never asked for any, so it never reports that it has finished.
         const bool complete = audio->finished() || audio->outProcessed() >= audio->totalOutSamples();
         if (video_.empty()) allDone_ = allDone_ && complete;
     }
@@ -96,7 +96,7 @@ void MainLoop::report(QvProgressReport& progress) {
     run_.callProgress(part);
 }
 
-// -1 when the disc of the output is full. A disc that does not tell counts as having space.
+// -1 when the disc of the output is full. A disc of unknown space counts as having some.
 int MainLoop::checkDisc() {
     const Any name = run_.task.encoder()->getFilename();
     if (!name.isText()) return QvStatus::ok;

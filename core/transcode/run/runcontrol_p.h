@@ -1,7 +1,7 @@
 // What the threads of a transcoder share: whether a run is going on, and the wishes to stop and to pause it.
 //
 // `stopping` and the state are polled without a lock; the pause and the list of workers have one, and one
-// condition wakes whoever waits for a pause, a stop or the end of a run.
+// condition wakes the threads that wait for a pause, a stop or the end of a run.
 #pragma once
 
 #include <atomic>

@@ -89,7 +89,7 @@ int TranscodeRun::breakOff() {
     try {
         run_.transcoder.cbDone(QvStatus::outOfMemory);
     } catch (...) {
-        // There is nobody left to tell.
+        // There is no other way to report it.
     }
     if (isLatest()) returnTask_();
     return QvStatus::outOfMemory;
@@ -131,7 +131,7 @@ int TranscodeRun::closeOutput(int result) {
 }
 
 int TranscodeRun::finish(int result) {
-    // An input that ended early ends the run as a stop does; only cbDone tells.
+    // An input that ended early ends the run as a stop does; only cbDone reports it.
     const bool ended = endOfVideo_ && result == QvStatus::endOfStream;
     if (ended) result = QvStatus::ok;
     if (run_.settings.closeEncoder) result = closeOutput(result);

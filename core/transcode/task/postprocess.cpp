@@ -47,13 +47,13 @@ void collectOutputs(QvEncodePipe& pipe, Names& names) {
     if (files.empty()) return;
     names.outPath = quoted(QvFile::getPath(files.at(0)));
     std::string base = narrow(QvFile::getBasename(files.at(0)));
-    // Several streams of a type are numbered behind a "#"; the base name is what they share.
+    // Several streams of a type are numbered after a "#"; the base name is what they share.
     const bool numbered = pipe.nrVideoStreams() > 1 || pipe.nrAudioStreams() > 1;
     if (files.size() > 1 && numbered) base = base.substr(0, base.find('#'));
     names.outBase = qv_platform().quoteForShell(base);
 }
 
-// The name that a number behind a placeholder means. Of "12" with three names only the "1" is the number;
+// The name that a number after a placeholder means. Of "12" with three names only the "1" is the number;
 // `used` is how many digits were. Without a usable number all names are meant.
 std::string numbered(const std::vector<std::string>& names, const char* digits, size_t& used) {
     size_t number = 0;
