@@ -16,9 +16,9 @@
 #include "core/engine/threads/qvthreads.h"
 #include "core/job/streamformat.h"
 #include "core/stream/qvbufstrm.h"
+#include "core/transcode/link/audio/transalink.h"
 #include "core/transcode/link/linkopen_p.h"
-#include "core/transcode/link/transalink.h"
-#include "core/transcode/link/transvlink.h"
+#include "core/transcode/link/video/transvlink.h"
 #include "core/transcode/push/pushfeed_p.h"
 #include "core/transcode/push/pushinput_p.h"
 

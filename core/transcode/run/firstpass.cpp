@@ -15,7 +15,7 @@
 #include "core/engine/threads/qvtimer.h"
 #include "core/preset/qvpreset.h"
 #include "core/stream/nav/qvmetadatafile.h"
-#include "core/transcode/link/transvlink.h"
+#include "core/transcode/link/video/transvlink.h"
 #include "core/transcode/run/qvprogressreport_p.h"
 #include "core/transcode/run/runcontrol_p.h"
 #include "core/transcode/run/runlinks_p.h"

@@ -2,7 +2,7 @@
 
 #include "builtin/modules.h"
 #include "core/filter/qvprocesspipe.h"
-#include "core/transcode/link/transvlink.h"
+#include "core/transcode/link/video/transvlink.h"
 #include "tests/support/checks.h"
 #include "tests/support/fake_filters.h"
 #include "tests/support/fake_streams.h"

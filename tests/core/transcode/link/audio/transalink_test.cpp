@@ -1,4 +1,4 @@
-#include "core/transcode/link/transalink.h"
+#include "core/transcode/link/audio/transalink.h"
 #include "builtin/modules.h"
 #include "core/filter/qvprocesspipe.h"
 #include "tests/support/checks.h"

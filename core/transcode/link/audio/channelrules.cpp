@@ -1,6 +1,6 @@
 #include <iterator>
 
-#include "core/transcode/link/channelrules_p.h"
+#include "core/transcode/link/audio/channelrules_p.h"
 #include "core/value/any.h"
 #include "core/value/anycontainer.h"
 

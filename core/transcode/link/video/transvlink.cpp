@@ -1,4 +1,4 @@
-#include "core/transcode/link/transvlink.h"
+#include "core/transcode/link/video/transvlink.h"
 
 #include <algorithm>
 
@@ -13,13 +13,13 @@
 #include "core/filter/qvprocessutil.h"
 #include "core/job/streamformat.h"
 #include "core/media/qvbuffer.h"
-#include "core/transcode/link/encodertraits_p.h"
-#include "core/transcode/link/framerange_p.h"
 #include "core/transcode/link/linkopen_p.h"
-#include "core/transcode/link/qualitylog_p.h"
-#include "core/transcode/link/smartrender_p.h"
 #include "core/transcode/link/steplog_p.h"
-#include "core/transcode/link/streamicon_p.h"
+#include "core/transcode/link/video/encodertraits_p.h"
+#include "core/transcode/link/video/framerange_p.h"
+#include "core/transcode/link/video/qualitylog_p.h"
+#include "core/transcode/link/video/smartrender_p.h"
+#include "core/transcode/link/video/streamicon_p.h"
 
 namespace {
 

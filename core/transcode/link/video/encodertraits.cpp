@@ -1,4 +1,4 @@
-#include "core/transcode/link/encodertraits_p.h"
+#include "core/transcode/link/video/encodertraits_p.h"
 
 #include <algorithm>
 

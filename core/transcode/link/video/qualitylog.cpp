@@ -1,4 +1,4 @@
-#include "core/transcode/link/qualitylog_p.h"
+#include "core/transcode/link/video/qualitylog_p.h"
 
 #include "core/encode/qvencodepipe.h"
 #include "core/engine/log/qvlog.h"

@@ -1,4 +1,4 @@
-#include "core/transcode/link/audiomuxer.h"
+#include "core/transcode/link/audio/audiomuxer.h"
 
 #include "tests/support/checks.h"
 #include "tests/support/fake_streams.h"

@@ -1,4 +1,4 @@
-#include "core/transcode/link/streammix_p.h"
+#include "core/transcode/link/audio/streammix_p.h"
 
 #include <algorithm>
 #include <cstring>

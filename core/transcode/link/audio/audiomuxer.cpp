@@ -1,10 +1,10 @@
-#include "core/transcode/link/audiomuxer.h"
+#include "core/transcode/link/audio/audiomuxer.h"
 
 #include "core/decode/qvdecoder.h"
 #include "core/encode/qvencoder.h"
 #include "core/engine/log/qvlog.h"
 #include "core/engine/status.h"
-#include "core/transcode/link/channelrules_p.h"
+#include "core/transcode/link/audio/channelrules_p.h"
 
 namespace {
 

@@ -1,4 +1,4 @@
-#include "core/transcode/link/channelmatrix_p.h"
+#include "core/transcode/link/audio/channelmatrix_p.h"
 
 #include <gtest/gtest.h>
 

@@ -1,4 +1,4 @@
-#include "core/transcode/link/streamicon_p.h"
+#include "core/transcode/link/video/streamicon_p.h"
 
 #include <memory>
 

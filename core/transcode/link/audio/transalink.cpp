@@ -1,4 +1,4 @@
-#include "core/transcode/link/transalink.h"
+#include "core/transcode/link/audio/transalink.h"
 
 #include <algorithm>
 
@@ -12,12 +12,12 @@
 #include "core/filter/qvprocesspipe.h"
 #include "core/filter/qvprocessutil.h"
 #include "core/job/jobdescription.h"
-#include "core/transcode/link/audiomuxer.h"
-#include "core/transcode/link/channelmatrix_p.h"
+#include "core/transcode/link/audio/audiomuxer.h"
+#include "core/transcode/link/audio/channelmatrix_p.h"
+#include "core/transcode/link/audio/sampleclock_p.h"
+#include "core/transcode/link/audio/streammix_p.h"
 #include "core/transcode/link/linkopen_p.h"
-#include "core/transcode/link/sampleclock_p.h"
 #include "core/transcode/link/steplog_p.h"
-#include "core/transcode/link/streammix_p.h"
 
 namespace {
 

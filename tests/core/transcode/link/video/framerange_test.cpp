@@ -1,4 +1,4 @@
-#include "core/transcode/link/framerange_p.h"
+#include "core/transcode/link/video/framerange_p.h"
 
 #include <gtest/gtest.h>
 

@@ -1,4 +1,4 @@
-#include "core/transcode/link/sampleclock_p.h"
+#include "core/transcode/link/audio/sampleclock_p.h"
 
 #include <utility>
 

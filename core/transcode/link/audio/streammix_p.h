@@ -7,7 +7,7 @@
 #include <vector>
 
 #include "core/media/qvbuffer.h"
-#include "core/transcode/link/channelmatrix_p.h"
+#include "core/transcode/link/audio/channelmatrix_p.h"
 
 class StreamMix {
   public:

@@ -2,7 +2,7 @@
 // passes through the link.
 #pragma once
 
-#include "core/transcode/link/framerange_p.h"
+#include "core/transcode/link/video/framerange_p.h"
 
 class QvDecodePipe;
 class QvEncodePipe;

@@ -1,4 +1,4 @@
-#include "core/transcode/link/smartrender_p.h"
+#include "core/transcode/link/video/smartrender_p.h"
 
 #include "core/arch/qvassert.h"
 #include "core/decode/qvdecoder.h"
