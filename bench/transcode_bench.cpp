@@ -161,7 +161,7 @@ int main() {
     fill(dots, 4 * 100000);
     auto pixels = rawSource(dots, QvFourcc::BGR4, 1, 1);
     bench.compare(
-        "1x1 pictures to nullmux : the same calls of decoder and output", 2.0,
+        "1x1 pictures to nullmux : the same calls of decoder and output", 3.0,
         [&] { transcode(*pixels, "nullmux", ""); }, [&] { bareCalls(*pixels); });
 
     const std::string raw = folder.file("in.yuv");
