@@ -8,7 +8,7 @@
 
 #include "builtin/modules.h"
 #include "core/filter/qvprocesspipe.h"
-#include "core/transcode/link/translink.h"
+#include "core/transcode/link/video/transvlink.h"
 #include "tests/support/fake_filters.h"
 #include "tests/support/fake_streams.h"
 

@@ -25,11 +25,11 @@ namespace {
 
 constexpr int kWidth = 1920, kHeight = 1080;
 
-std::unique_ptr<QvDecodePipe> rawSource(const std::string& name, int width, int height) {
+std::unique_ptr<QvDecodePipe> rawSource(const std::string& name, unsigned fourcc, int width, int height) {
     std::unique_ptr<QvDecodePipe> decoder(
         static_cast<QvDecodePipe*>(qv_registry()->newCodec("rawdec")->getInterface(2)));
     decoder->setParam("filename", name.c_str());
-    decoder->setParam("FOURCC", static_cast<int>(QvFourcc::I420));
+    decoder->setParam("FOURCC", static_cast<int>(fourcc));
     decoder->setParam("width", width);
     decoder->setParam("height", height);
     decoder->open();
@@ -54,8 +54,8 @@ std::unique_ptr<QvDecodePipe> generator(int seconds) {
     return decoder;
 }
 
-// Transcodes every stream of a decoder to files (or to nothing), in the formats that they have.
-int transcode(QvDecodePipe& decoder, const char* muxer, const std::string& output) {
+// An output for every stream of a decoder, in the formats that they have.
+std::unique_ptr<QvEncodePipe> outputFor(QvDecodePipe& decoder, const char* muxer) {
     std::unique_ptr<QvEncodePipe> pipe(QvEncodePipe::create());
     pipe->clearStreams();
     pipe->setMuxer(muxer);
@@ -71,6 +71,12 @@ int transcode(QvDecodePipe& decoder, const char* muxer, const std::string& outpu
         for (const char* key : {"samplerate", "channels", "bitsPerSample"})
             pipe->audioEncoder(i)->setParam(key, decoder.getAudioParam(i, key));
     }
+    return pipe;
+}
+
+// Transcodes every stream of a decoder to files, or to nothing.
+int transcode(QvDecodePipe& decoder, const char* muxer, const std::string& output) {
+    const auto pipe = outputFor(decoder, muxer);
     if (!output.empty()) pipe->setFilename(Any(output.c_str()));
     QvTranscoder transcoder;
     transcoder.setEncoder(pipe.get());
@@ -78,6 +84,16 @@ int transcode(QvDecodePipe& decoder, const char* muxer, const std::string& outpu
     transcoder.setParam("startDelay", 0);
     transcoder.linkAll();
     return transcoder.transcode(true);
+}
+
+// What the main loop passes on, without the loop.
+void bareCalls(QvDecodePipe& decoder) {
+    const auto pipe = outputFor(decoder, "nullmux");
+    pipe->videoStream(0)->setEnabled(true);
+    decoder.seek(MediaTime(), qvVideoStream, 0);
+    pipe->open();
+    while (decoder.readFrame(0) == 0) pipe->writeFrame(decoder.getFramePtr(0), 0);
+    pipe->close();
 }
 
 // What the plainest copier does: blocks of 1 MiB.
@@ -140,9 +156,17 @@ int main() {
                             static_cast<size_t>(from.total_bytes()));
         });
 
+    // Pictures of one pixel, so that nearly all of the time is the loop's and that of the calls through it.
+    const std::string dots = folder.file("dots.bgr4");
+    fill(dots, 4 * 100000);
+    auto pixels = rawSource(dots, QvFourcc::BGR4, 1, 1);
+    bench.compare(
+        "1x1 pictures to nullmux : the same calls of decoder and output", 3.0,
+        [&] { transcode(*pixels, "nullmux", ""); }, [&] { bareCalls(*pixels); });
+
     const std::string raw = folder.file("in.yuv");
     fill(raw, size_t{kWidth} * kHeight * 3 / 2 * 100);
-    auto reader = rawSource(raw, kWidth, kHeight);
+    auto reader = rawSource(raw, QvFourcc::I420, kWidth, kHeight);
     bench.compare(
         "raw I420 file to raw file : 1 MiB read and write", 1.5,
         [&] { transcode(*reader, "rawmux", folder.file("out.yuv")); },
@@ -161,7 +185,7 @@ int main() {
     // The peak must not move with the length of the input: the second job is four times the first.
     const double before = peakMiB();
     fill(raw, size_t{kWidth} * kHeight * 3 / 2 * 400);
-    reader = rawSource(raw, kWidth, kHeight);
+    reader = rawSource(raw, QvFourcc::I420, kWidth, kHeight);
     transcode(*reader, "nullmux", "");
     QvRatioBench::tell("peak memory, 100 frames", before, "MiB");
     QvRatioBench::tell("peak memory, 400 frames", peakMiB(), "MiB");

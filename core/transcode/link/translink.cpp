@@ -10,6 +10,7 @@
 #include "core/engine/modules/qvregistry.h"
 #include "core/engine/qvutil.h"
 #include "core/engine/status.h"
+#include "core/transcode/link/linkopen_p.h"
 
 TransLink::TransLink() = default;
 
@@ -57,6 +58,12 @@ int TransLink::init(QvDecodePipe* decoder, int decStream, QvEncodePipe* encoder,
     errorDesc_ = "";
     return QvStatus::ok;
 }
+
+int TransLink::open(const AnyDict* params) { return openWith(LinkOpen(params)); }
+
+QvFramerate TransLink::outFramerate() const { return QvFramerate::f24p(); }
+
+long long TransLink::totalOutSamples() const { return 0; }
 
 double TransLink::samplesPerFrame() const { QV_FAIL("TransLink::splsPerFrame - Not implemented"); }
 
@@ -136,13 +143,9 @@ void TransLink::nameStreams() {
 
 void TransLink::readLogProgress() { logProgress_ = qv_registry()->getDbgOption("log_progress").isTrue(); }
 
-bool TransLink::takePoints(const AnyDict* params, const MediaTime& end) {
-    const AnyVector& given = params ? params->getVector("inOutPoints") : AnyVector::null();
-    if (given.size() < 2) {
-        inOutPoints_ = InOutPoints(MediaTime(), end);
-        return false;
-    }
-    inOutPoints_ = InOutPoints(given);
+bool TransLink::takePoints(const LinkOpen& given, const MediaTime& end) {
+    inOutPoints_ = given.points.value_or(InOutPoints(MediaTime(), end));
+    if (!given.points) return false;
     // What the setters write for the half of a pair that was not given.
     if (inOutPoints_.outPoint().value() == 0) inOutPoints_.setOutPoint(end);
     return true;

@@ -9,22 +9,19 @@
 #include <initializer_list>
 #include <memory>
 #include <utility>
-#include <vector>
 
 #include "core/arch/api.h"
-#include "core/job/jobdescription.h"
 #include "core/job/processparams.h"
-#include "core/media/qvbuffer.h"
+#include "core/measure/qvgeometry.h"
+#include "core/measure/streamtype.h"
 #include "core/value/any.h"
 
-class QvAProcessPipe;
-class QvAudioEncoder;
+class QvCancel;
 class QvCodec;
 class QvDecodePipe;
 class QvEncodePipe;
 class QvException;
-class QvPSNRLogger;
-class QvVProcessPipe;
+struct LinkOpen;
 
 class QV_API TransLink {
   public:
@@ -34,15 +31,15 @@ class QV_API TransLink {
     TransLink& operator=(const TransLink& other);
     virtual ~TransLink();
 
-    virtual int type() const = 0;  // the stream type: 1 video, 2 audio
+    virtual int type() const = 0;  // qvVideoStream or qvAudioStream
     // -1 for an encoder stream that does not exist (video); misuse asserts.
     virtual int init(QvDecodePipe* decoder, int decStream, QvEncodePipe* encoder, int encStream);
     // Reads the formats, takes the points and builds the conversion. `params` (may be null): "inOutPoints",
     // "chapters", "effects", "audioEffects", "connMatrix", "smartRender", "qualityStats". -1 when open
     // already.
-    virtual int open(const AnyDict* params) = 0;
+    virtual int open(const AnyDict* params);
     // Ends the run. A closed link is left alone: 0. Otherwise 0 or what a filter failed with since open, here
-    // or before: filters let frames pass that they could not work on, and no step tells.
+    // or before: filters let frames pass that they could not work on, and no step reports it.
     virtual int close() = 0;
     // One step: a frame for video, exactly n samples for audio. The status of the writer, or of the reader
     // when it failed before the expected end.
@@ -67,6 +64,11 @@ class QV_API TransLink {
     // The format of the decoder stream, and the giving of a format to the encoder stream.
     virtual void _getInParams(AnyDict& params) const;
     virtual int _setOutParams(const AnyDict& params);
+    // The same as open, for callers that have no dictionary.
+    virtual int openWith(const LinkOpen& given) = 0;
+    // The rate at which the frames of this link count; 24 a second for audio, which has none.
+    virtual QvFramerate outFramerate() const;
+    virtual long long totalOutSamples() const;  // samples that the output is to get; 0 for video
 
     QvDecodePipe* decoder() const { return decoder_; }
     QvEncodePipe* encoder() const { return encoder_; }
@@ -78,6 +80,8 @@ class QV_API TransLink {
     MediaTime outPoint() const { return inOutPoints_.outPoint(); }
     int errorCode() const { return errorCode_; }
     const char* errorDesc() const;  // never null
+    // Ends the waits of filters that are a QvCancellable; in force from the next open on. Null: nothing does.
+    void setCancel(std::shared_ptr<QvCancel> cancel) { cancel_ = std::move(cancel); }
     // Makes the encoder stream take the format of the decoder stream. -1 before init.
     int copyFormat();
 
@@ -90,7 +94,7 @@ class QV_API TransLink {
     void nameStreams();
     void readLogProgress();
     // The points of `params`, or 0 to `end`, where also an out point of 0 lies; true if they were given.
-    bool takePoints(const AnyDict* params, const MediaTime& end);
+    bool takePoints(const LinkOpen& given, const MediaTime& end);
     // The description of encoder and filters that ends the log of a link.
     void logEncoder(const QvCodec& encoder, std::initializer_list<const char*> names) const;
     static void logFilter(int number, const QvCodec& filter);
@@ -106,172 +110,8 @@ class QV_API TransLink {
     bool worked_ = false;  // an audio step has delivered something
     ProcessParams processParams_;
     InOutPoints inOutPoints_;
+    std::shared_ptr<QvCancel> cancel_;
     bool logProgress_ = false;
     Any errorDesc_;
     int errorCode_ = 0;
-};
-
-// Captions that come from a decoder stream of their own.
-struct QV_API MetaVHelper {
-    QvDecodePipe* decoder = nullptr;  // not owned
-    int stream = -1;
-    MetaProcessParams params;
-};
-
-class QV_API TransVLink : public TransLink {
-  public:
-    TransVLink();
-    TransVLink(const TransVLink& other);
-    TransVLink& operator=(const TransVLink& other);
-    ~TransVLink() override;
-
-    int type() const override { return 1; }
-    int init(QvDecodePipe* decoder, int decStream, QvEncodePipe* encoder, int encStream) override;
-    int open(const AnyDict* params) override;
-    int close() override;
-    int processFrame(int n) override;
-    int totalOutFrames() const override { return nrFramesOut_; }
-    double completed() const override;
-    void log() override;
-    long long outProcessed() const override { return framesWritten_; }
-    QvCodec* filter(const char* name, int index) const override;
-    int addMetaSource(QvDecodePipe* decoder, int type, int stream, const MetaProcessParams& params) override;
-    int nrMetaSources() const override;
-    QvDecodePipe* metaSource(int index) const override;
-    int metaSourceStreamNr(int index) const override;
-
-    // Ends the waits of filters that are a QvCancellable; in force from the next open on. Null: nothing does.
-    void setCancel(std::shared_ptr<QvCancel> cancel) { cancel_ = std::move(cancel); }
-
-    const QvFramerate& outFramerate() const { return outFramerate_; }
-    int nrFramesIn() const { return nrFramesIn_; }
-    int startFrame() const { return startFrame_; }
-    int stopFrame() const { return stopFrame_; }
-
-  private:
-    struct Step;
-
-    int views(const Any& value) const;
-    unsigned chooseFOURCC(unsigned inFOURCC) const;
-    int takeFrameRange(const AnyDict* params, const AnyDict& stream);
-    bool applyChapters(const AnyDict* params);
-    void describeJob(const AnyDict* params, const AnyDict& stream);
-    int buildPipe();
-    void _setTotalVDuration();
-    bool pipeAllowsSmartRender() const;
-    void setupSmartRender(bool wanted);
-    void setupLogger(const AnyDict* params);
-    void writeLog();
-    void releasePipe();
-
-    void smartStep(Step& step);
-    void pipeStep(Step& step);
-    void directStep(Step& step);
-    void writeStep(Step& step);
-    void endStep(Step& step);
-    void repeatLast(Step& step);
-    int _processOneFrame();
-    QvFrame* completePair();
-    void feedMetaSources(QvFrame* frame);
-    void makeIcon(QvFrame* frame) const;
-    int writeFrame(QvFrame* frame);
-
-    QvEncodingQualityStatsSetup qualitySetup_;
-    std::unique_ptr<QvPSNRLogger> psnrLogger_;
-    QvFramerate outFramerate_;
-    std::unique_ptr<QvVProcessPipe> videoPipe_;  // null when no processing is needed
-    int nrFramesIn_ = 0;                         // frames to read, from in to out point
-    int nrFramesOut_ = 0;                        // frames that the encoder is to get
-    bool pairCompleted_ = false;                 // nrFramesIn_ is one more than the range has
-    int framesWritten_ = 0;                      // -1 after close
-    int startFrame_ = 0;                         // at the input rate
-    int stopFrame_ = 0;                          // inclusive
-    int decViews_ = 1;
-    int encViews_ = 1;
-    std::vector<std::unique_ptr<MetaVHelper>> metaSources_;
-    VideoJobDescription job_;  // of the pipe, which may keep a pointer to it
-    std::shared_ptr<QvCancel> cancel_;
-};
-
-class QV_API TransALink : public TransLink {
-  public:
-    TransALink();
-    ~TransALink() override;
-
-    int type() const override { return 2; }
-    int init(QvDecodePipe* decoder, int decStream, QvEncodePipe* encoder, int encStream) override;
-    int open(const AnyDict* params) override;
-    int close() override;
-    int processFrame(int n) override;
-    int totalOutFrames() const override;
-    double samplesPerFrame() const override;
-    double completed() const override;
-    void log() override;
-    long long outSamplesPerFrames(int n, const QvFramerate& rate) const override;
-    long long outProcessed() const override { return processed_ + 1; }
-    QvCodec* filter(const char* name, int index) const override;
-
-    // Writes n samples of silence. 0, whatever the writer says.
-    virtual int _insertSilence(int n);
-
-    long long totalOutSamples() const { return totalOutSamples_; }
-
-    // For mixing several input streams into one link.
-    // The streams that a matrix names, in rising order; with `select` those not selected yet are, and stand
-    // in `newlySelected` after it.
-    AnyVector _getNeededInputStreams(const AnyVector& matrix, AnyVector& newlySelected, bool select);
-    // A matrix in the numbering of a channel converter: a channel counts from all channels of the streams
-    // before its own; -1 for silence and for a stream that takes no part.
-    AnyVector _connMatrixToFilter(const AnyVector& matrix) const;
-    int _filterChannelNr(const AnyVector& streams, int stream, int channel) const;
-    // Interleaves the current buffers of the streams of the mix into one buffer, owned by the link. Null
-    // without a stream.
-    QvPcm* _muxStreams();
-
-  private:
-    struct Source;
-
-    int readFormat(const AnyDict& stream);
-    bool _verifyConnMatrix() const;
-    bool verifySource(const Any& source, int channel, int index) const;
-    void logMatrix() const;
-    void takeMatrix(const AnyDict* params);
-    int buildPipe(const AnyDict* params, MediaTime& delay);
-    void shiftPoints(const MediaTime& delay, const MediaTime& end);
-    void computeRange();
-    void setupSmartRender(const AnyDict* params);
-    Source sourceOf(const Any& source) const;
-    QvAudioEncoder* audioEncoder() const;
-
-    int smartStep(int n);
-    int directStep(int n);
-    int pipeStep(int n);
-    int endStep(int result);
-    int readFailed();
-    void logDone(const char* what) const;
-    bool prepareSilence(int n);
-
-    long long totalInSamples_ = 0;
-    long long totalOutSamples_ = 0;
-    long long processed_ = -1;  // index of the last sample written
-    int inSamplerate_ = 0;
-    int outSamplerate_ = 0;
-    int steps_ = 0;
-    int outChannels_ = 0;
-    QvPcm silence_;
-    AnyVector connMatrix_;
-    AnyVector selectedStreams_;
-    AnyVector muxStreams_;
-    AnyVector muxChannels_;
-    QvPcm muxBuffer_;
-    int outBytesPerSample_ = 0;
-    int inBytesPerSample_ = 0;
-    bool silenceLogged_ = false;
-    std::unique_ptr<QvAProcessPipe> audioPipe_;
-    bool smartRendering_ = false;
-    int inBits_ = 0;
-    int outBits_ = 0;
-    int inChannels_ = 0;
-    long long inStart_ = 0;  // samples of the input, from in to out point
-    long long inEnd_ = 0;
 };

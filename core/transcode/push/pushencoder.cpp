@@ -14,8 +14,11 @@
 #include "core/engine/qvutil.h"
 #include "core/engine/status.h"
 #include "core/engine/threads/qvthreads.h"
+#include "core/job/streamformat.h"
 #include "core/stream/qvbufstrm.h"
-#include "core/transcode/link/translink.h"
+#include "core/transcode/link/audio/transalink.h"
+#include "core/transcode/link/linkopen_p.h"
+#include "core/transcode/link/video/transvlink.h"
 #include "core/transcode/push/pushfeed_p.h"
 #include "core/transcode/push/pushinput_p.h"
 
@@ -271,10 +274,9 @@ int PushEncoder::PushEncoder_p::openVideoLink() {
     if (encoder->nrVideoStreams() == 0) return setError(QvStatus::failed, "The output has no video stream");
     if (const int result = videoLink.init(&input, 0, encoder, 0)) return result;
     encoder->videoStream(0)->setEnabled(true);
-    AnyDict params;
-    if (const auto filters = videoStreams.front()->process.filters())
-        params.set("effects", static_cast<const AnyDict&>(*filters));
-    const int result = videoLink.open(&params);
+    LinkOpen open;
+    if (const auto filters = videoStreams.front()->process.filters()) open.effects = *filters;
+    const int result = videoLink.openWith(open);
     return result == QvStatus::ok ? result : setError(result, videoLink.errorDesc());
 }
 
@@ -283,12 +285,11 @@ int PushEncoder::PushEncoder_p::openAudioLink() {
     if (encoder->nrAudioStreams() == 0) return setError(QvStatus::failed, "The output has no audio stream");
     if (const int result = audioLink.init(&input, 0, encoder, 0)) return result;
     encoder->audioStream(0)->setEnabled(true);
-    AnyDict params;
+    LinkOpen open;
     const auto& process = audioStreams.front()->process;
-    if (const auto filters = process.filters())
-        params.set("audioEffects", static_cast<const AnyDict&>(*filters));
-    if (const auto* map = process.audioChannelMap()) params.set("connMatrix", *map);
-    const int result = audioLink.open(&params);
+    if (const auto filters = process.filters()) open.takeAudioEffects(*filters);
+    if (const auto* map = process.audioChannelMap()) open.connMatrix = *map;
+    const int result = audioLink.openWith(open);
     return result == QvStatus::ok ? result : setError(result, audioLink.errorDesc());
 }
 
@@ -338,7 +339,6 @@ int QvPushEncoder::addAudioStream(AnyDict& params, ProcessParams* process) {
     if (!legal) return QvStatus::failed;
 
     auto stream = std::make_unique<AStream>();
-    stream->params = params;
     stream->channels = channels;
     stream->bytesPerSample = bytes;
     if (process) {
@@ -366,16 +366,14 @@ int QvPushEncoder::addVideoStream(AnyDict& params, ProcessParams* process) {
     QV_ASSERT_MSG(p_->state == stateClosed, "Invalid state");
     int length = params.getInt32("bufferLength", 0);
     if (length < 1) length = defaultFrames;
-    const auto fourcc = static_cast<unsigned>(params.getInt32("FOURCC", 0));
-    const int width = params.getInt32("width", 0);
-    const int height = params.getInt32("height", 0);
-    const Any& rate = params["framerate"];
-    if (!qvPixelFormat(fourcc) || width < 1 || height < 1 || !rate.isFramerate())
+    const VideoFormat video(params);
+    const bool hasRate = params["framerate"].isFramerate();
+    if (!qvPixelFormat(video.fourcc) || video.width < 1 || video.height < 1 || !hasRate)
         return p_->setError(QvStatus::failed,
                             "The format of the video is not complete: FOURCC, width, height, framerate");
     auto stream = std::make_unique<VStream>();
-    stream->params = params;
-    if (const int result = stream->buffer.init(length, fourcc, width, height, rate.asFramerate()))
+    if (const int result =
+            stream->buffer.init(length, video.fourcc, video.width, video.height, video.framerate))
         return p_->setError(result, "Out of memory");
     if (process)
         if (const auto filters = process->filters()) stream->process.setFilters(*filters);

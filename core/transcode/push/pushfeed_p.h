@@ -44,7 +44,7 @@ class FrameBuffer {
     QvFramerate rate_;
 };
 
-// Samples of one format, one behind the other.
+// Samples of one format, in the order in which they came.
 class SampleBuffer {
   public:
     int init(int capacity, int sampleBytes);
@@ -63,7 +63,6 @@ class SampleBuffer {
 
 // The part that both kinds of stream have.
 struct PushStream {
-    AnyDict params;
     ProcessParams process;
     bool end = false;                  // under the lock of its kind
     std::atomic<bool> waiting{false};  // the worker is, for this stream

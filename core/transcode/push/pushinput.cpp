@@ -1,5 +1,6 @@
 #include "core/arch/qvassert.h"
 #include "core/engine/status.h"
+#include "core/job/streamformat.h"
 #include "core/media/qvbuffer.h"
 #include "core/transcode/push/pushfeed_p.h"
 #include "core/transcode/push/pushinput_p.h"
@@ -21,8 +22,8 @@ int PushInput::openVideo(const AnyDict& params) {
     auto& stream = *addStream(std::make_unique<DPipeVideoStream>());
     stream.params = params;
     stream.frame = std::make_unique<QvFrame>();
-    return stream.frame->init(static_cast<unsigned>(params.getInt32("FOURCC", 0)),
-                              params.getInt32("width", 0), params.getInt32("height", 0));
+    const VideoFormat format(params);
+    return stream.frame->init(format.fourcc, format.width, format.height);
 }
 
 int PushInput::openAudio(const AnyDict& params) {

@@ -1,8 +1,10 @@
+#include "core/transcode/run/qvprogressreport_p.h"
+
 #include <algorithm>
 #include <climits>
 #include <string_view>
 
-#include "core/transcode/run/qvtranscoderun_p.h"
+#include "core/value/anycontainer.h"
 
 namespace {
 

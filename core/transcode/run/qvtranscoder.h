@@ -30,7 +30,7 @@ class QvDPipeList;
 class QvEncodePipe;
 class QvMuxer;
 class QvTask;
-class QvTranscodeRun;
+class TranscodeRun;
 class TransLink;
 
 class QV_API QvTranscoder {
@@ -129,8 +129,7 @@ class QV_API QvTranscoder {
     int setError(int code, const char* format, ...) QV_PRINTF(3, 4);
 
   private:
-    friend class QvTranscodeRun;
     struct Private;
-    bool startWorker(QvTranscodeRun& run);
+    bool startWorker(TranscodeRun& run);
     std::unique_ptr<Private> p_;
 };

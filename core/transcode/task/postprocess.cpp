@@ -1,4 +1,5 @@
-// The command that runs after a task: its placeholders and the file names that replace them.
+#include "core/transcode/task/postprocess_p.h"
+
 #include <cctype>
 #include <string>
 #include <vector>
@@ -8,7 +9,6 @@
 #include "core/encode/qvencodepipe.h"
 #include "core/encode/qvmuxer.h"
 #include "core/engine/files/qvfileutil.h"
-#include "core/transcode/task/qvtranscodetask.h"
 
 namespace {
 
@@ -47,13 +47,13 @@ void collectOutputs(QvEncodePipe& pipe, Names& names) {
     if (files.empty()) return;
     names.outPath = quoted(QvFile::getPath(files.at(0)));
     std::string base = narrow(QvFile::getBasename(files.at(0)));
-    // Several streams of a type are numbered behind a "#"; the base name is what they share.
-    const bool numbered = pipe.nrStreams(1) > 1 || pipe.nrStreams(2) > 1;
+    // Several streams of a type are numbered after a "#"; the base name is what they share.
+    const bool numbered = pipe.nrVideoStreams() > 1 || pipe.nrAudioStreams() > 1;
     if (files.size() > 1 && numbered) base = base.substr(0, base.find('#'));
     names.outBase = qv_platform().quoteForShell(base);
 }
 
-// The name that a number behind a placeholder means. Of "12" with three names only the "1" is the number;
+// The name that a number after a placeholder means. Of "12" with three names only the "1" is the number;
 // `used` is how many digits were. Without a usable number all names are meant.
 std::string numbered(const std::vector<std::string>& names, const char* digits, size_t& used) {
     size_t number = 0;
@@ -95,11 +95,11 @@ std::string replacePlaceholders(const std::string& command, const Names& names) 
 
 }  // namespace
 
-Any QvTask::currentPostprocessCommand() const {
-    if (!postprocess_.isString()) return postprocess_;
+Any qvPostprocessCommand(const Any& command, const QvDPipeList& inputs, QvEncodePipe* output) {
+    if (!command.isString()) return command;
     Names names;
-    for (int i = 0; i < decoders_.size(); ++i)
-        names.inputs.push_back(quoted(decoders_.at(i)->getParam("filename")));
-    if (encoder_) collectOutputs(*encoder_, names);
-    return Any(replacePlaceholders(postprocess_.asString(), names).c_str());
+    for (int i = 0; i < inputs.size(); ++i)
+        names.inputs.push_back(quoted(inputs.at(i)->getParam("filename")));
+    if (output) collectOutputs(*output, names);
+    return Any(replacePlaceholders(command.asString(), names).c_str());
 }

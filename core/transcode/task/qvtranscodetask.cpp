@@ -12,15 +12,17 @@
 #include "core/engine/log/qvlog.h"
 #include "core/engine/status.h"
 #include "core/stream/qvbufstrm.h"
-#include "core/transcode/link/translink.h"
+#include "core/transcode/link/audio/transalink.h"
+#include "core/transcode/link/video/transvlink.h"
+#include "core/transcode/task/postprocess_p.h"
+#include "core/transcode/task/taskcheck_p.h"
+#include "core/transcode/task/taskstore_p.h"
 
 namespace {
 
-constexpr int kTypes[] = {1, 2, 4};
+constexpr int kTypes[] = {qvVideoStream, qvAudioStream, qvSubpicStream};
 
-int indexOfType(int type) { return type == 1 ? 0 : type == 2 ? 1 : 2; }
-
-bool inMask(int type, int mask) { return mask == 0 || (mask & type) != 0; }
+int indexOfType(int type) { return type == qvVideoStream ? 0 : type == qvAudioStream ? 1 : 2; }
 
 }  // namespace
 
@@ -30,9 +32,9 @@ QvTask::~QvTask() = default;
 
 const char* QvTask::typeName(int type) {
     switch (type) {
-        case 1: return "video";
-        case 2: return "audio";
-        case 4: return "subpic";
+        case qvVideoStream: return "video";
+        case qvAudioStream: return "audio";
+        case qvSubpicStream: return "subpic";
     }
     QV_FAIL_PLAIN();
 }
@@ -47,9 +49,9 @@ int QvTask::setError(int code, const char* format, ...) {
     try {
         errorText_ = text;
     } catch (const std::bad_alloc&) {
-        errorText_.clear();  // a failure is never told by throwing
+        errorText_.clear();  // a failure is never reported by throwing
     }
-    qv_dbg()->log(2, "Task: %s (%d)", text, code);
+    qv_dbg()->log(QvLogMask::error, "Task: %s (%d)", text, code);
     return code;
 }
 
@@ -64,9 +66,10 @@ int QvTask::link(QvDecodePipe* decoder, int type, int decStream, int encStream) 
         return setError(QvStatus::failed, "Decoder (%p) %s#%d already linked to encoder %s#%d",
                         static_cast<void*>(decoder), typeName(type), decStream, typeName(type), already);
     }
-    if (decoder->getState() != 3) {
+    if (decoder->getState() != QvDecodePipe::stateOpen) {
         if (const int result = decoder->open(); result != QvStatus::ok) {
-            qv_dbg()->log(2, "Transcoder.link: failed to open %p", static_cast<void*>(decoder));
+            qv_dbg()->log(QvLogMask::error, "Transcoder.link: failed to open %p",
+                          static_cast<void*>(decoder));
             errorCode_ = result;
             errorText_ = decoder->errorDesc();
             return result;
@@ -81,9 +84,11 @@ int QvTask::link(QvDecodePipe* decoder, int type, int decStream, int encStream) 
 int QvTask::makeLink(QvDecodePipe* decoder, int type, int decStream, int encStream) {
     std::unique_ptr<TransLink> link;
     switch (type) {
-        case 1: link = std::make_unique<TransVLink>(); break;
-        case 2: link = std::make_unique<TransALink>(); break;
-        case 4: qv_dbg()->warning("Task.link: don't know how to link subpic streams"); return QvStatus::ok;
+        case qvVideoStream: link = std::make_unique<TransVLink>(); break;
+        case qvAudioStream: link = std::make_unique<TransALink>(); break;
+        case qvSubpicStream:
+            qv_dbg()->warning("Task.link: don't know how to link subpic streams");
+            return QvStatus::ok;
         default: QV_FAIL_PLAIN();
     }
     if (link->init(decoder, decStream, encoder_, encStream) != QvStatus::ok)
@@ -112,7 +117,7 @@ int QvTask::link(QvDecodePipe* decoder) {
     QV_ASSERT_MSG(decoder, "Task.link: invalid argument");
     QV_ASSERT_MSG(encoder_, "Task.link: encoder not specified");
     unlink();
-    for (int type : {1, 2})
+    for (int type : {qvVideoStream, qvAudioStream})
         if (const int result = linkAllOfType(decoder, type); result < 0) return result;
     updateBSEnabled();
     return QvStatus::ok;
@@ -140,11 +145,11 @@ int QvTask::linkMeta(QvDecodePipe* decoder, int type, int decStream, int, int en
                      const MetaProcessParams& params) {
     QV_ASSERT_MSG(encoder_, "Transcoder.linkMeta: failed, encoder is not set");
     QV_ASSERT_MSG(decoder, "Transcoder.linkMeta: invalid argument: dp is 0");
-    QV_ASSERT_MSG(type == 4, "Transcoder.linkMeta: invalid argument: type is not QV_SUBPIC_CC");
+    QV_ASSERT_MSG(type == qvSubpicStream, "Transcoder.linkMeta: invalid argument: type is not QV_SUBPIC_CC");
     if (!decoder->isSelected(type, decStream) && decoder->select(type, decStream) != QvStatus::ok)
         return setError(QvStatus::failed, "Task.link: select() failed on (%p) %s#%d -> %d",
                         static_cast<void*>(decoder), typeName(type), decStream, encStream);
-    TransLink* video = getLinkForOutput(1, encStream);
+    TransLink* video = getLinkForOutput(qvVideoStream, encStream);
     QV_ASSERT_MSG(video,
                   "Transcoder.linkMeta: invalid state: Can not link meta before video stream is linked");
     addDecoder(decoder);
@@ -240,7 +245,7 @@ const ProcessParams& QvTask::processParams(int type) const {
 
 int QvTask::setProcessParams(const ProcessParams& params, int typeMask) {
     for (int type : kTypes) {
-        if (!inMask(type, typeMask)) continue;
+        if (!qvStreamTypeMatches(type, typeMask)) continue;
         ProcessParams& own = paramsOf(type);
         if (params.get("inOutPoints").isVector()) own.set("inOutPoints", params.get("inOutPoints"));
         if (params.get("filters").isDict()) {
@@ -249,12 +254,13 @@ int QvTask::setProcessParams(const ProcessParams& params, int typeMask) {
             own.set("filters", params.get("filters"));
         }
         if (params.get("chapters").isVector()) {
-            QV_ASSERT_MSG(type == 1,
+            QV_ASSERT_MSG(type == qvVideoStream,
                           "QvTask.setProcessParams: cannot apply chapterPoints to non-video stream");
             own.set("chapters", params.get("chapters"));
         }
         if (params.get("audioChannelMap").isVector()) {
-            QV_ASSERT_MSG(type == 2, "QvTask.setProcessParams: cannot apply channelMap to non-audio stream");
+            QV_ASSERT_MSG(type == qvAudioStream,
+                          "QvTask.setProcessParams: cannot apply channelMap to non-audio stream");
             own.set("audioChannelMap", params.get("audioChannelMap"));
         }
         if (params.getInt32("smartRender", 0) != 0) own.set("smartRender", params.get("smartRender"));
@@ -264,29 +270,102 @@ int QvTask::setProcessParams(const ProcessParams& params, int typeMask) {
 
 void QvTask::clearProcessParams(int typeMask) {
     for (int type : kTypes)
-        if (inMask(type, typeMask)) paramsOf(type).clear();
+        if (qvStreamTypeMatches(type, typeMask)) paramsOf(type).clear();
 }
+
+namespace {
+
+// What a stream's parameters give to the opening of its link.
+struct OpenRow {
+    const char* key;
+    const char* openKey;
+    bool (*given)(const Any&);
+    int types;  // of streams
+};
+
+bool isVector(const Any& value) { return value.isVector(); }
+bool isDict(const Any& value) { return value.isDict(); }
+bool isMode(const Any& value) { return value.isInt32() && value.asInt32() != 0; }
+
+constexpr int allButAudio = qvVideoStream | qvSubpicStream;
+constexpr OpenRow openRows[] = {
+    {"inOutPoints", "inOutPoints", isVector, qvAllStreams},
+    {"smartRender", "smartRender", isMode, qvAllStreams},
+    {"filters", "audioEffects", isDict, qvAudioStream},
+    {"filters", "effects", isDict, allButAudio},
+    {"qualityStats", "qualityStats", isVector, qvAllStreams},
+    {"audioChannelMap", "connMatrix", isVector, qvAudioStream},
+    {"chapters", "chapters", isVector, qvVideoStream},
+};
+
+}  // namespace
 
 void QvTask::makeOpenParams(const QvTask& task, const TPtrList<TransLink>& links, AnyVector& out) {
     out.clear();
-    for (int i = 0; i < links.size(); ++i) {
-        const TransLink& link = *links.at(i);
-        const bool audio = link.type() == 2;
-        const AnyDict& own = link.processParams();
-        const AnyDict& common = task.processParams(link.type());
+    for (const TransLink* link : links) {
+        const AnyDict& own = link->processParams();
+        const AnyDict& common = task.processParams(link->type());
         AnyDict params;
-        const auto take = [&](const char* key, const char* openKey, auto isGiven) {
-            const Any& value = isGiven(own.get(key)) ? own.get(key) : common.get(key);
-            if (isGiven(value)) params.set(openKey, value);
-        };
-        const auto isVector = [](const Any& value) { return value.isVector(); };
-        take("inOutPoints", "inOutPoints", isVector);
-        take("smartRender", "smartRender",
-             [](const Any& value) { return value.isInt32() && value.asInt32() != 0; });
-        take("filters", audio ? "audioEffects" : "effects", [](const Any& value) { return value.isDict(); });
-        take("qualityStats", "qualityStats", isVector);
-        if (audio) take("audioChannelMap", "connMatrix", isVector);
-        if (link.type() == 1) take("chapters", "chapters", isVector);
+        for (const OpenRow& row : openRows) {
+            if (!(row.types & link->type())) continue;
+            const Any& value = row.given(own.get(row.key)) ? own.get(row.key) : common.get(row.key);
+            if (row.given(value)) params.set(row.openKey, value);
+        }
         out.append(params);
     }
+}
+
+// --- What is decided elsewhere ---------------------------------------------------------------------
+
+Any QvTask::currentPostprocessCommand() const {
+    return qvPostprocessCommand(postprocess_, decoders_, encoder_);
+}
+
+int QvTask::checkStreams() {
+    const TaskFault fault = TaskCheck(encoder_, links()).streams();
+    return fault.code == QvStatus::ok ? fault.code : setError(fault.code, "%s", fault.text.c_str());
+}
+
+int QvTask::checkLegal(AnyVector& messages) {
+    return TaskCheck(encoder_, links()).legal(processParams(qvAudioStream), messages);
+}
+
+int QvTask::checkMultiPass(TPtrList<TransLink>* list) const {
+    return TaskCheck(encoder_, links()).multiPass(list);
+}
+
+int QvTask::checkSmartRender(AnyDict* dict) const { return TaskCheck(encoder_, links()).smartRender(dict); }
+
+void QvTask::store(AnyDict& dict, int) const { qvtaskstore::store(*this, dict); }
+
+int QvTask::restore(const AnyDict& state, QvDPipeList& decoders, QvEncodePipe** encoderOut, int,
+                    QvFileOpenCb* callback) {
+    unlink();
+    if (!qvtaskstore::isTask(state)) {
+        setError(QvStatus::invalidStructure, "Task.restore: Invalid task state structure");
+        QV_FAIL(errorDesc());
+    }
+    const TaskFault fault = qvtaskstore::restore(*this, state, decoders, encoderOut, callback);
+    if (!fault.text.empty()) setError(fault.code, "%s", fault.text.c_str());
+    return fault.code;
+}
+
+QvTask* QvTask::fromState(const AnyDict& state, QvDPipeList& decoders, QvEncodePipe** encoderOut, int options,
+                          QvFileOpenCb* callback, Any* error) {
+    auto task = std::make_unique<QvTask>();
+    QvEncodePipe* pipe = nullptr;
+    const int result = task->restore(state, decoders, &pipe, options, callback);
+    if (result == QvStatus::ok || result == QvStatus::warning) {
+        if (encoderOut) *encoderOut = pipe;
+        return task.release();
+    }
+    if (error) *error = Any(task->errorDesc());
+    task.reset();
+    delete pipe;
+    decoders.deleteAll();
+    return nullptr;
+}
+
+QvTask* QvTask::fromStateWithSource(const AnyDict& state, QvDecodePipe* decoder, int typeMask) {
+    return qvtaskstore::fromTemplate(state, decoder, typeMask).release();
 }

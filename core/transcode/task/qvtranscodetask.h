@@ -137,14 +137,9 @@ class QV_API QvTask {
   private:
     int makeLink(QvDecodePipe* decoder, int type, int decStream, int encStream);
     int linkAllOfType(QvDecodePipe* decoder, int type);
-    int checkMultiView();
-    int checkDolbyPassthrough(TransLink& link, int smartRender, AnyVector& messages) const;
     void updateBSEnabled();
     void addDecoder(QvDecodePipe* decoder);
     ProcessParams& paramsOf(int type);
-    int openInputs(const AnyVector& files, QvDPipeList& opened, QvFileOpenCb* callback);
-    int linkStoredStream(const AnyDict& entry, int index, const QvDPipeList& decoders);
-    struct ForgetEncoder;
 
     QvDPipeList decoders_;
     std::vector<std::unique_ptr<TransLink>> links_;

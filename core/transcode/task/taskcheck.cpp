@@ -1,4 +1,5 @@
-// What a task verifies before a run: that its links can work together and what they allow.
+#include "core/transcode/task/taskcheck_p.h"
+
 #include <iterator>
 #include <string>
 #include <string_view>
@@ -9,12 +10,12 @@
 #include "core/encode/qvencoder.h"
 #include "core/encode/qvmuxer.h"
 #include "core/engine/log/qvlog.h"
+#include "core/engine/modules/moduletraits_p.h"
 #include "core/engine/modules/qvmodule.h"
 #include "core/engine/modules/qvregistry.h"
 #include "core/engine/status.h"
 #include "core/preset/qvpreset.h"
 #include "core/transcode/link/translink.h"
-#include "core/transcode/task/qvtranscodetask.h"
 
 namespace {
 
@@ -33,10 +34,6 @@ Any smartRenderParams(const TransLink& link) {
     return value;
 }
 
-bool isDolbyEncoder(std::string_view name) {
-    return name == "ddaenc" || name == "ddproaenc" || name == "ddplusproaenc";
-}
-
 void appendLine(std::string& text, std::string_view line, const char* separator) {
     if (line.empty()) return;
     if (!text.empty()) text += separator;
@@ -51,8 +48,9 @@ std::string soundFilters(const AnyDict& params) {
     for (int i = 0; i < filters.size(); ++i) {
         if (!filters.at(i).isDict() || !filters.at(i).asDict().get("_on").isTrue()) continue;
         const std::string_view name = filters.at(i).asDict().getString("name", "");
-        if (name.empty() || name == "srconvert" || name == "chconvert" || name == "aquant") continue;
+        if (name.empty()) continue;
         const QvModule* module = qv_registry()->module(std::string(name).c_str());
+        if (qvModuleTraits(name, module).convertsFormat) continue;
         appendLine(names, module ? std::string_view(module->displayName()) : name, ", ");
     }
     return names;
@@ -60,60 +58,60 @@ std::string soundFilters(const AnyDict& params) {
 
 }  // namespace
 
-int QvTask::checkStreams() {
-    if (!encoder_ || links_.empty())
-        return setError(QvStatus::failed, "No connected streams / sources not defined");
+TaskFault TaskCheck::streams() const {
+    if (!encoder_ || links_.empty()) return {QvStatus::failed, "No connected streams / sources not defined"};
     int video = 0, audio = 0;
-    for (const auto& link : links_) {
-        video += link->type() == 1;
-        audio += link->type() == 2;
+    for (const TransLink* link : links_) {
+        video += link->type() == qvVideoStream;
+        audio += link->type() == qvAudioStream;
     }
     if (QvMuxer* muxer = encoder_->getMuxer(); muxer && video == 0) {
         const Any necessary = muxer->getParam("videoNecessary");
         if (necessary.isTrue()) {
-            if (necessary.isString()) return setError(QvStatus::failed, "%s", necessary.asString());
-            return setError(QvStatus::failed, "%s requires video stream", muxer->displayName());
+            if (necessary.isString()) return {QvStatus::failed, necessary.asString()};
+            return {QvStatus::failed, std::string(muxer->displayName()) + " requires video stream"};
         }
     }
-    if (const int result = checkMultiView(); result != QvStatus::ok) return result;
+    if (const TaskFault fault = views(); fault.code != QvStatus::ok) return fault;
     if (const QvPreset* preset = encoder_->activePreset()) {
         const int profile = preset->profile();
         const bool handheld = profile > kHandheldProfileLow && profile < kHandheldProfileHigh;
         if (handheld && (video == 0 || audio == 0))
-            return setError(QvStatus::failed, "PSP files require both video and audio streams");
+            return {QvStatus::failed, "PSP files require both video and audio streams"};
     }
-    return QvStatus::ok;
+    return {};
 }
 
-int QvTask::checkMultiView() {
-    for (const auto& link : links_) {
-        if (link->type() != 1) continue;
+TaskFault TaskCheck::views() const {
+    for (const TransLink* link : links_) {
+        if (link->type() != qvVideoStream) continue;
         const QvVideoEncoder* encoder = encoder_->videoEncoder(link->encStreamNr());
         QV_ASSERT_MSG(encoder, "checkMultiview: video encoder is Null");
         const int given = viewsOf(link->decoder()->getVideoParam(link->decStreamNr(), "nrViews"));
         const int required = viewsOf(encoder->QvCodec::getParam("nrViews"));
         if (required > 1 && given < required)
-            return setError(
-                QvStatus::notEnoughViews,
-                "Source contains only %d view(s), encoder requires multi-view source with %d views.", given,
-                required);
+            return {QvStatus::notEnoughViews,
+                    Any::sprintf(
+                        "Source contains only %d view(s), encoder requires multi-view source with %d views.",
+                        given, required)
+                        .asString("")};
         if (given > required)
             qv_dbg()->warning(
                 "Source contains %d views and encoder requires %d, views above %d will be discarded.", given,
                 required, required);
     }
-    return QvStatus::ok;
+    return {};
 }
 
-int QvTask::checkLegal(AnyVector& messages) {
+int TaskCheck::legal(const ProcessParams& common, AnyVector& messages) const {
     int result = QvStatus::ok;
-    for (const auto& link : links_) {
-        if (link->type() != 2) continue;
+    for (const TransLink* link : links_) {
+        if (link->type() != qvAudioStream) continue;
         const QvAudioEncoder* encoder = encoder_->audioEncoder(link->encStreamNr());
-        if (!encoder || !isDolbyEncoder(encoder->name())) continue;
+        if (!encoder || qvModuleTraits(*encoder).family != CodecFamily::dolby) continue;
         const Any codec = link->decoder()->getAudioParam(link->decStreamNr(), "codec");
         if (!(codec == "Dolby")) continue;
-        const int verdict = checkDolbyPassthrough(*link, kDolbySmartRender, messages);
+        const int verdict = dolbyPassthrough(*link, kDolbySmartRender, common, messages);
         if (verdict == QvStatus::failed)
             result = QvStatus::notLegal;
         else if (verdict == QvStatus::warning && result == QvStatus::ok)
@@ -122,7 +120,8 @@ int QvTask::checkLegal(AnyVector& messages) {
     return result;
 }
 
-int QvTask::checkDolbyPassthrough(TransLink& link, int smartRender, AnyVector& messages) const {
+int TaskCheck::dolbyPassthrough(const TransLink& link, int mode, const ProcessParams& common,
+                                AnyVector& messages) const {
     Any params = smartRenderParams(link);
     std::string text;
     int verdict = QvStatus::ok;
@@ -131,8 +130,8 @@ int QvTask::checkDolbyPassthrough(TransLink& link, int smartRender, AnyVector& m
         verdict = params.asInt32(QvStatus::ok);  // the decoder's own answer, if it gave one
     } else {
         const AnyDict& own = link.processParams();
-        const std::string filters = soundFilters(own.isSet("filters") ? own : processParams(2));
-        if (!filters.empty() && smartRender == kDolbySmartRender) {
+        const std::string filters = soundFilters(own.isSet("filters") ? own : common);
+        if (!filters.empty() && mode == kDolbySmartRender) {
             text =
                 "Not possible to use audio filters when both input and output audio formats are Dolby. "
                 "Please remove following filters: " +
@@ -152,11 +151,11 @@ int QvTask::checkDolbyPassthrough(TransLink& link, int smartRender, AnyVector& m
     return verdict;
 }
 
-int QvTask::checkSmartRender(AnyDict* dict) const {
+int TaskCheck::smartRender(AnyDict* dict) const {
     AnyVector video;
     if (encoder_) {
-        for (const auto& link : links_) {
-            if (link->type() != 1) continue;
+        for (const TransLink* link : links_) {
+            if (link->type() != qvVideoStream) continue;
             const QvVideoEncoder* encoder = encoder_->videoEncoder(link->encStreamNr());
             Any answer = smartRenderParams(*link);
             if (!encoder || !answer.isDict()) continue;
@@ -173,13 +172,13 @@ int QvTask::checkSmartRender(AnyDict* dict) const {
     return count;
 }
 
-int QvTask::checkMultiPass(TPtrList<TransLink>* list) const {
+int TaskCheck::multiPass(TPtrList<TransLink>* list) const {
     int count = 0;
-    for (const auto& link : links_) {
-        if (link->type() != 1 || !encoder_) continue;
+    for (TransLink* link : links_) {
+        if (link->type() != qvVideoStream || !encoder_) continue;
         const QvVideoEncoder* encoder = encoder_->videoEncoder(link->encStreamNr());
         if (!encoder || !encoder->QvCodec::getParam("twoPassPossible").isTrue()) continue;
-        if (list) list->append(link.get());
+        if (list) list->append(link);
         ++count;
     }
     return count;

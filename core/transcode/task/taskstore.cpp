@@ -1,6 +1,6 @@
-// A task as a stored dictionary, and back.
+#include "core/transcode/task/taskstore_p.h"
+
 #include <algorithm>
-#include <memory>
 
 #include "core/arch/qvassert.h"
 #include "core/arch/qvexception.h"
@@ -11,7 +11,8 @@
 #include "core/engine/qvutil.h"
 #include "core/engine/status.h"
 #include "core/transcode/link/translink.h"
-#include "core/transcode/task/qvtranscodetask.h"
+
+namespace qvtaskstore {
 
 namespace {
 
@@ -56,56 +57,7 @@ void removeSurplusStreams(QvEncodePipe& pipe, int type, int wanted) {
     while (pipe.nrStreams(type) > wanted) pipe.removeStream(type, pipe.nrStreams(type) - 1);
 }
 
-}  // namespace
-
-struct QvTask::ForgetEncoder {
-    QvTask& task;
-    bool armed = true;
-    ~ForgetEncoder() {
-        if (!armed) return;
-        task.links_.clear();
-        task.decoders_.clear();
-        task.encoder_ = nullptr;
-    }
-};
-
-void QvTask::store(AnyDict& dict, int) const {
-    dict.clear();
-    dict.set("__version__", "2.0");
-    dict.set("__class__", "TranscodeTask");
-    AnyVector files;
-    for (int i = 0; i < decoders_.size(); ++i) {
-        AnyDict file, decoder;
-        file.set("filename", decoders_.at(i)->QvCodec::getParam("filename"));
-        decoders_.at(i)->store(decoder);
-        file.set("decoder", decoder);
-        files.append(file);
-    }
-    dict.set("files", files);
-    if (postprocess_.isValid()) dict.set("postProcess", postprocess_);
-    if (!encoder_) return;
-    AnyDict encoder;
-    encoder_->store(encoder);
-    dict.set("encoder", encoder);
-    dict.set("filename", encoder_->getFilename());
-    AnyVector streams;
-    for (int i = 0; i < encoder_->nrStreams(); ++i) {
-        QvOStream* stream = encoder_->streamAt(i);
-        const int number = encoder_->streamNr(stream);
-        AnyDict entry;
-        entry.set("type", stream->type);
-        if (const TransLink* link = getLinkForOutput(stream->type, number)) {
-            QV_ASSERT(link->encStreamNr() == number);
-            AnyVector sources;
-            sources.append(storedSource(*link));
-            entry.set("sources", sources);
-        }
-        streams.append(entry);
-    }
-    dict.set("streams", streams);
-}
-
-int QvTask::openInputs(const AnyVector& files, QvDPipeList& opened, QvFileOpenCb* callback) {
+int openInputs(const AnyVector& files, QvDPipeList& opened, QvFileOpenCb* callback) {
     const int before = opened.size();
     for (int i = 0; i < files.size(); ++i) {
         if (!files.at(i).isDict()) continue;
@@ -120,50 +72,28 @@ int QvTask::openInputs(const AnyVector& files, QvDPipeList& opened, QvFileOpenCb
     return opened.size() - before;
 }
 
-int QvTask::restore(const AnyDict& state, QvDPipeList& decoders, QvEncodePipe** encoderOut, int,
-                    QvFileOpenCb* callback) {
-    unlink();
-    if (!state.get("__version__").isString() || !(state.get("__class__") == "TranscodeTask")) {
-        setError(QvStatus::invalidStructure, "Task.restore: Invalid task state structure");
-        QV_FAIL(errorDesc());
+// While it is armed the task's output can still go with a failure, so nothing may point to it then.
+class ForgetEncoder {
+  public:
+    explicit ForgetEncoder(QvTask& task) : task_(task) {}
+    ForgetEncoder(const ForgetEncoder&) = delete;
+    ForgetEncoder& operator=(const ForgetEncoder&) = delete;
+    ~ForgetEncoder() {
+        if (!armed_) return;
+        task_.setEncoder(nullptr);
+        task_.unlink();
     }
-    const Any& settings = state.get("encoder");
-    const AnyVector streams = state.getVector("streams");
-    const char* noStreams = "Task.restore: Invalid task state structure - no output streams";
-    if (streams.empty()) return setError(QvStatus::invalidStructure, "%s", noStreams);
-    if (!settings.isDict() || settings.asDict().empty()) {
-        QvUtil::debugOutDict(state);
-        return setError(QvStatus::invalidStructure,
-                        "Task.restore: Invalid task state structure - missing encoder settings");
-    }
-    if (settings.asDict().getVector("streams").empty())
-        return setError(QvStatus::invalidStructure, "%s", noStreams);
-    std::unique_ptr<QvEncodePipe> pipe(QvEncodePipe::create());
-    QV_ASSERT_MSG(pipe, "Task.restore: could not create EncodePipe");
-    if (const int result = pipe->restore(settings.asDict()); result != QvStatus::ok)
-        return setError(result, "Task.restore: %s", pipe->errorDesc());
-    if (state.get("filename").isText()) pipe->setFilename(state.get("filename"));
-    const AnyVector& files = state.getVector("files");
-    if (files.empty())
-        return setError(QvStatus::invalidStructure,
-                        "Task.restore: invalid task state structure - no input file(s) specified");
-    if (openInputs(files, decoders, callback) == 0)
-        return setError(QvStatus::cannotParse, "Task.restore: no input file(s) successfully opened");
-    encoder_ = pipe.get();
-    ForgetEncoder forget{*this};  // the pipe goes with a failure, so nothing may point to it
-    for (int i = 0; i < pipe->nrStreams(); ++i) {
-        const AnyDict entry = streams.at(i).isDict() ? streams.at(i).asDict() : AnyDict();
-        if (const int result = linkStoredStream(entry, i, decoders); result < 0) return result;
-    }
-    postprocess_ = state.get("postProcess");
-    forget.armed = false;
-    QvEncodePipe* made = pipe.release();
-    if (encoderOut) *encoderOut = made;
-    return QvStatus::ok;
-}
+    void disarm() { armed_ = false; }
 
-int QvTask::linkStoredStream(const AnyDict& entry, int index, const QvDPipeList& decoders) {
-    QvEncodePipe& pipe = *encoder_;
+  private:
+    QvTask& task_;
+    bool armed_ = true;
+};
+
+TaskFault damaged(const char* text) { return {QvStatus::invalidStructure, text}; }
+
+int linkStoredStream(QvTask& task, const AnyDict& entry, int index, const QvDPipeList& decoders) {
+    QvEncodePipe& pipe = *task.encoder();
     QvOStream* stream = pipe.streamAt(index);
     const int number = pipe.streamNr(stream);
     QV_ASSERT(entry.empty() || entry.getInt32("type", 0) == stream->type);
@@ -177,43 +107,106 @@ int QvTask::linkStoredStream(const AnyDict& entry, int index, const QvDPipeList&
     const Pair address = source.get("stream").asPair();
     QV_ASSERT(address.first == stream->type);
     QvDecodePipe* decoder = decoders.findByFilename(source.get("file"), nullptr);
-    while (decoder && linkedTo(decoder, address.first, address.second) >= 0)
+    while (decoder && task.linkedTo(decoder, address.first, address.second) >= 0)
         decoder = decoders.findByFilename(source.get("file"), decoder);
     QV_ASSERT_MSG(decoder, "no available decoders, decoder must be cloned...");
     if (!decoder->isSelected(address.first, address.second)) decoder->select(address.first, address.second);
     ProcessParams params;
     params.update(source.getDict("process"));
-    return link(decoder, address.first, address.second, number, params);
+    return task.link(decoder, address.first, address.second, number, params);
 }
 
-QvTask* QvTask::fromState(const AnyDict& state, QvDPipeList& decoders, QvEncodePipe** encoderOut, int options,
-                          QvFileOpenCb* callback, Any* error) {
-    auto task = std::make_unique<QvTask>();
-    QvEncodePipe* pipe = nullptr;
-    const int result = task->restore(state, decoders, &pipe, options, callback);
-    if (result == QvStatus::ok || result == QvStatus::warning) {
-        if (encoderOut) *encoderOut = pipe;
-        return task.release();
+}  // namespace
+
+void store(const QvTask& task, AnyDict& dict) {
+    dict.clear();
+    dict.set("__version__", "2.0");
+    dict.set("__class__", "TranscodeTask");
+    const QvDPipeList& decoders = task.decoders();
+    AnyVector files;
+    for (int i = 0; i < decoders.size(); ++i) {
+        AnyDict file, decoder;
+        file.set("filename", decoders.at(i)->QvCodec::getParam("filename"));
+        decoders.at(i)->store(decoder);
+        file.set("decoder", decoder);
+        files.append(file);
     }
-    if (error) *error = Any(task->errorDesc());
-    task.reset();
-    delete pipe;
-    decoders.deleteAll();
-    return nullptr;
+    dict.set("files", files);
+    if (task.postprocessCommand().isValid()) dict.set("postProcess", task.postprocessCommand());
+    QvEncodePipe* pipe = task.encoder();
+    if (!pipe) return;
+    AnyDict encoder;
+    pipe->store(encoder);
+    dict.set("encoder", encoder);
+    dict.set("filename", pipe->getFilename());
+    AnyVector streams;
+    for (int i = 0; i < pipe->nrStreams(); ++i) {
+        QvOStream* stream = pipe->streamAt(i);
+        const int number = pipe->streamNr(stream);
+        AnyDict entry;
+        entry.set("type", stream->type);
+        if (const TransLink* link = task.getLinkForOutput(stream->type, number)) {
+            QV_ASSERT(link->encStreamNr() == number);
+            AnyVector sources;
+            sources.append(storedSource(*link));
+            entry.set("sources", sources);
+        }
+        streams.append(entry);
+    }
+    dict.set("streams", streams);
 }
 
-QvTask* QvTask::fromStateWithSource(const AnyDict& state, QvDecodePipe* decoder, int typeMask) {
+bool isTask(const AnyDict& state) {
+    return state.get("__version__").isString() && state.get("__class__") == "TranscodeTask";
+}
+
+TaskFault restore(QvTask& task, const AnyDict& state, QvDPipeList& decoders, QvEncodePipe** encoderOut,
+                  QvFileOpenCb* callback) {
+    const Any& settings = state.get("encoder");
+    const AnyVector streams = state.getVector("streams");
+    const char* noStreams = "Task.restore: Invalid task state structure - no output streams";
+    if (streams.empty()) return damaged(noStreams);
+    if (!settings.isDict() || settings.asDict().empty()) {
+        QvUtil::debugOutDict(state);
+        return damaged("Task.restore: Invalid task state structure - missing encoder settings");
+    }
+    if (settings.asDict().getVector("streams").empty()) return damaged(noStreams);
+    std::unique_ptr<QvEncodePipe> pipe(QvEncodePipe::create());
+    QV_ASSERT_MSG(pipe, "Task.restore: could not create EncodePipe");
+    if (const int result = pipe->restore(settings.asDict()); result != QvStatus::ok)
+        return {result, std::string("Task.restore: ") + pipe->errorDesc()};
+    if (state.get("filename").isText()) pipe->setFilename(state.get("filename"));
+    const AnyVector& files = state.getVector("files");
+    if (files.empty())
+        return damaged("Task.restore: invalid task state structure - no input file(s) specified");
+    if (openInputs(files, decoders, callback) == 0)
+        return {QvStatus::cannotParse, "Task.restore: no input file(s) successfully opened"};
+    task.setEncoder(pipe.get());
+    ForgetEncoder forget(task);
+    for (int i = 0; i < pipe->nrStreams(); ++i) {
+        const AnyDict entry = streams.at(i).isDict() ? streams.at(i).asDict() : AnyDict();
+        if (const int result = linkStoredStream(task, entry, i, decoders); result < 0) return {result, ""};
+    }
+    task.setPostprocessCommand(state.get("postProcess"));
+    forget.disarm();
+    QvEncodePipe* made = pipe.release();
+    if (encoderOut) *encoderOut = made;
+    return {};
+}
+
+std::unique_ptr<QvTask> fromTemplate(const AnyDict& state, QvDecodePipe* decoder, int typeMask) {
     QV_ASSERT(decoder);
     std::unique_ptr<QvEncodePipe> pipe(QvEncodePipe::create());
     QV_ASSERT_MSG(pipe, "Task.restore: could not create EncodePipe");
     if (pipe->restore(state.getDict("encoder")) != QvStatus::ok) return nullptr;
-    for (int type : {1, 2}) removeSurplusStreams(*pipe, type, decoder->nrStreams(type));
+    for (int type : {qvVideoStream, qvAudioStream})
+        removeSurplusStreams(*pipe, type, decoder->nrStreams(type));
     auto task = std::make_unique<QvTask>();
     task->setEncoder(pipe.get());
     const AnyVector streams = state.getVector("streams");
-    for (int type : {1, 2, 4}) {
+    for (int type : {qvVideoStream, qvAudioStream, qvSubpicStream}) {
         const int given = decoder->nrStreams(type), wanted = pipe->nrStreams(type);
-        if ((typeMask == 0 || (typeMask & type)) && wanted > 0 && given == 0) {
+        if (qvStreamTypeMatches(type, typeMask) && wanted > 0 && given == 0) {
             qv_log()->error("Can not create task, input file does not contain enough streams");
             return nullptr;
         }
@@ -227,12 +220,15 @@ QvTask* QvTask::fromStateWithSource(const AnyDict& state, QvDecodePipe* decoder,
             ProcessParams own;
             if (params.get("filters").isDict()) own.set("filters", params.get("filters"));
             if (TransLink* link = task->getLinkForOutput(type, k)) link->setProcessParams(own);
-            if (params.getInt32("smartRender", 0) != 0)
-                task->paramsOf(type).set("smartRender", params.get("smartRender"));
+            ProcessParams common;
+            common.set("smartRender", params.get("smartRender"));
+            task->setProcessParams(common, type);
         }
         removeSurplusStreams(*pipe, type, std::min(given, wanted));
     }
     task->setPostprocessCommand(state.get("postProcess"));
     pipe.release();
-    return task.release();
+    return task;
 }
+
+}  // namespace qvtaskstore

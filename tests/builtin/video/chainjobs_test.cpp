@@ -4,7 +4,7 @@
 #include "core/filter/qvfiltersetup.h"
 #include "core/filter/userdatacallback.h"
 #include "core/job/filtersstate.h"
-#include "core/transcode/link/translink.h"
+#include "core/transcode/link/video/transvlink.h"
 #include "core/transcode/task/qvtranscodetask.h"
 #include "tests/core/filter/chains.h"
 #include "tests/support/engine.h"

@@ -3,7 +3,7 @@
 #include <string>
 #include <vector>
 
-#include "core/transcode/run/qvtranscoderun_p.h"
+#include "core/transcode/run/qvprogressreport_p.h"
 
 namespace {
 
