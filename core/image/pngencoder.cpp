@@ -23,7 +23,7 @@ constexpr size_t drawingRatio = 8;
 // One strip out of each group of rows is packed both ways to find out whether filters help. A strip has rows
 // enough for matches between them.
 constexpr size_t strip = 8;
-constexpr size_t group = 96;
+constexpr size_t group = 192;
 constexpr size_t chunkBytes = size_t{1} << 23;
 
 struct FreeCompressor {
