@@ -25,7 +25,6 @@ namespace hn = hwy::HWY_NAMESPACE;
 constexpr size_t pixelBytes = 3;
 
 const hn::ScalableTag<uint8_t> d8;
-const hn::Repartition<int8_t, decltype(d8)> di8;
 const hn::Repartition<uint64_t, decltype(d8)> d64;
 using V8 = hn::Vec<decltype(hn::ScalableTag<uint8_t>())>;
 using V64 = hn::Vec<decltype(hn::Repartition<uint64_t, hn::ScalableTag<uint8_t>>())>;

@@ -36,8 +36,8 @@ class Block {
 };
 
 // At least `slots` lines of `length` items. A line is found by its number until as many others have come. The
-// places are a power of two: a division for each of the lines that a target line takes would cost as much as the
-// work on them.
+// places are a power of two: a division for each of the lines that a target line takes would cost as much as
+// the work on them.
 template <class T>
 class Ring {
   public:
