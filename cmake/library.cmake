@@ -10,7 +10,7 @@ target_compile_definitions(qv_objects PRIVATE QV_BUILDING_LIBRARY)
 target_include_directories(qv_objects PUBLIC ${CMAKE_SOURCE_DIR})
 target_link_libraries(qv_objects PUBLIC
   Threads::Threads ZLIB::ZLIB PNG::PNG EXPAT::EXPAT Freetype::Freetype
-  PkgConfig::FONTCONFIG PkgConfig::HARFBUZZ PkgConfig::FRIBIDI PkgConfig::UNIBREAK PkgConfig::UCHARDET
+  PkgConfig::DEFLATE PkgConfig::FONTCONFIG PkgConfig::HARFBUZZ PkgConfig::FRIBIDI PkgConfig::UNIBREAK PkgConfig::UCHARDET
   PkgConfig::CRYPTOPP PkgConfig::HWY
   ${CMAKE_DL_LIBS})
 

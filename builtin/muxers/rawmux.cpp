@@ -211,6 +211,7 @@ int RawMux::openVideo(int nr) {
     const auto size = output.getParam("size");
     if (split && size.isInt32() && size.asInt32() > 0) output.setParam("chunk", size);
     output.setParam("png", png ? 1 : 0);
+    output.setParam("parallel", png ? 1 : 0);
     if (png) {
         output.setParam("width", encoder->getParam("width"));
         output.setParam("height", encoder->getParam("height"));

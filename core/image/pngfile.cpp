@@ -11,6 +11,7 @@
 
 #include "core/engine/log/qvlog.h"
 #include "core/engine/status.h"
+#include "core/image/pngencoder_p.h"
 #include "core/media/qvframe.h"
 
 namespace {
@@ -49,19 +50,6 @@ class Reader {
     ~Reader() { png_destroy_read_struct(&png, &info, nullptr); }
 };
 
-class Writer {
-  public:
-    Message message;
-    png_structp png = png_create_write_struct_2(PNG_LIBPNG_VER_STRING, &message, onError, onWarning, nullptr,
-                                                allocate, release);
-    png_infop info = png ? png_create_info_struct(png) : nullptr;
-
-    Writer() = default;
-    Writer(const Writer&) = delete;
-    Writer& operator=(const Writer&) = delete;
-    ~Writer() { png_destroy_write_struct(&png, &info); }
-};
-
 struct ImageHead {
     int width = 0;
     int height = 0;
@@ -98,17 +86,6 @@ bool readRowsJumping(png_structp png, png_infop info, png_bytepp rows) {
     if (setjmp(png_jmpbuf(png))) return false;
     png_read_image(png, rows);
     png_read_end(png, info);
-    return true;
-}
-
-bool writeJumping(png_structp png, png_infop info, std::FILE* file, png_uint_32 width, png_uint_32 height,
-                  png_bytepp rows) {
-    if (setjmp(png_jmpbuf(png))) return false;
-    png_init_io(png, file);
-    png_set_IHDR(png, info, width, height, 8, PNG_COLOR_TYPE_RGB, PNG_INTERLACE_NONE,
-                 PNG_COMPRESSION_TYPE_DEFAULT, PNG_FILTER_TYPE_DEFAULT);
-    png_set_rows(png, info, rows);
-    png_write_png(png, info, PNG_TRANSFORM_BGR, nullptr);
     return true;
 }
 
@@ -186,10 +163,9 @@ int qvReadPng(std::FILE* file, const char* name, QvFrame& picture, QvFrame* alph
 }
 
 bool qvWritePng(const QvFrame& frame, std::FILE* file) {
-    Writer writer;
-    if (!writer.info) return false;
-    // libpng takes the rows as writable and only reads them.
-    auto rows = rowPointers(const_cast<QvFrame&>(frame), frame.height());
-    return writeJumping(writer.png, writer.info, file, static_cast<png_uint_32>(frame.width()),
-                        static_cast<png_uint_32>(frame.height()), rows.data());
+    PngEncoder encoder;
+    if (!encoder.prepare(frame.width(), frame.height())) return false;
+    encoder.take(frame);
+    encoder.compress();
+    return encoder.write(file);
 }

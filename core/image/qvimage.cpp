@@ -12,6 +12,7 @@
 #include "core/engine/status.h"
 #include "core/filter/qvfilter.h"
 #include "core/image/bmpfile_p.h"
+#include "core/image/picturefile_p.h"
 #include "core/image/pngfile_p.h"
 #include "core/image/wholepicture_p.h"
 #include "core/media/qvframe.h"
@@ -51,13 +52,6 @@ const QvFrame* asBgr3(const QvFrame& frame, std::unique_ptr<QvCodec>& scaler) {
     return filter->frame();
 }
 
-// Nothing is left that looks like a picture. Devices and pipes stay.
-void removePartial(const std::string& name) {
-    QvFileStatus status;
-    if (qv_platform().status(name.c_str(), status) && status.isRegular)
-        qv_platform().removeFile(name.c_str());
-}
-
 }  // namespace
 
 int QvImage::saveFrame(const QvFrame& frame, const Any& path, int format) {
@@ -70,24 +64,18 @@ int QvImage::saveFrame(const QvFrame& frame, const Any& path, int format) {
         return QvStatus::failed;
     }
     const std::string name = fileName(path);
-    bool isStream = false;
-    File file(qv_platform().openOutput(name.c_str(), nullptr, isStream));
-    if (!file) {
+    PictureFile file;
+    if (!file.open(name, nullptr)) {
         const int reason = errno;
-        qv_log()->error("[Save image] Can not open %s for writing.", name.c_str());
+        qv_log()->error(qvPictureNotOpened, name.c_str());
         errno = reason;
         return QvStatus::failed;
     }
     errno = 0;
-    bool written = format == bmp ? qvWriteBmp(*picture, file.get()) : qvWritePng(*picture, file.get());
-    int reason = errno;
-    if (std::fclose(file.release()) != 0) {
-        if (written) reason = errno;
-        written = false;
-    }
-    if (written) return QvStatus::ok;
-    qv_log()->error("Can not write file");
-    if (!isStream) removePartial(name);
+    const bool written = format == bmp ? qvWriteBmp(*picture, file.get()) : qvWritePng(*picture, file.get());
+    if (file.finish(written)) return QvStatus::ok;
+    const int reason = errno;
+    qv_log()->error(qvPictureNotWritten);
     errno = reason;
     return QvStatus::failed;
 }

@@ -10,9 +10,12 @@
 #include "core/engine/files/qvfileutil.h"
 #include "core/engine/log/qvlog.h"
 #include "core/engine/status.h"
+#include "core/engine/threads/qvthreadpool.h"
 #include "core/filter/qvcolorconvert.h"
+#include "core/image/picturefile_p.h"
 #include "core/image/qvimage.h"
 #include "core/media/qvframe.h"
+#include "core/split/picturequeue_p.h"
 #include "core/split/qvbufstreamsplit.h"
 #include "core/stream/file/qvfilebufstream.h"
 #include "core/stream/iofailure.h"
@@ -54,6 +57,8 @@ int QvBsSplitVideo::initPictures() {
     width_ = params().getInt32("width", 0);
     height_ = params().getInt32("height", 0);
     fourcc_ = static_cast<unsigned>(params().getInt32("FOURCC", 0));
+    if (params().get("parallel").isTrue())
+        queue_ = std::make_unique<PictureQueue>(qvThreadPool(), width_, height_);
     if (fourcc_ == QvFourcc::BGR3) return QvStatus::ok;
     converted_ = std::make_unique<QvFrame>();
     if (converted_->init(QvFourcc::BGR3, width_, height_) != QvStatus::ok) {
@@ -81,6 +86,13 @@ int QvBsSplitVideo::initPlain(const AnyDict& newParams) {
 }
 
 void QvBsSplitVideo::destroy(int abort) {
+    if (queue_) {
+        if (abort)
+            queue_->drop();
+        else if (!queue_->finish())
+            noteLost();
+        queue_.reset();
+    }
     if (split_) QvBufStreamFifoCb::destroy(abort);
     if (inner_) inner_->destroy(abort);
     inner_.reset();
@@ -90,6 +102,10 @@ void QvBsSplitVideo::destroy(int abort) {
 }
 
 void QvBsSplitVideo::flush() {
+    if (queue_ && !queue_->finish()) {
+        noteLost();
+        stopProcessing();
+    }
     if (split_)
         QvBufStreamFifoCb::flush();
     else if (inner_)
@@ -178,9 +194,25 @@ bool QvBsSplitVideo::writePicture(bufstream* ring, unsigned bytes, const Any& na
 bool QvBsSplitVideo::savePicture(const QvFrame& frame, const Any& name) {
     const QvFrame& picture = converter_ ? *converted_ : frame;
     if (converter_ && converter_->convert(frame, *converted_) != QvStatus::ok) return false;
+    if (queue_) {
+        if (queue_->put(picture, qv_os_name(name), cancel())) return true;
+        noteLost();
+        return false;
+    }
     if (QvImage::saveFrame(picture, name, QvImage::png) == QvStatus::ok) return true;
     failure()->note(errno, "Failed to write to", qv_wide_name(qv_os_name(name)));
     return false;
+}
+
+// The queue's failure becomes the stream's, once.
+void QvBsSplitVideo::noteLost() {
+    const auto& lost = queue_->failure();
+    if (failure()->code() != 0) return;
+    failure()->note(lost.code, "Failed to write to", qv_wide_name(lost.name));
+    if (lost.opened)
+        qv_log()->error(qvPictureNotWritten);
+    else
+        qv_log()->error(qvPictureNotOpened, lost.name.c_str());
 }
 
 bool QvBsSplitVideo::writeFile(bufstream* ring, unsigned bytes, const Any& name) {

@@ -14,11 +14,15 @@
 class QvColorConverter;
 class QvFileBufStream;
 class QvFrame;
+class PictureQueue;
 
 // Parameters: "outfilename"; "split" Int32 0 for a plain file, anything else for files NAME#0.EXT, NAME#1.EXT
 // and so on; "nrDigits" (Int32), width of the number, with zeros in front; "png" true to write each access
 // unit as a PNG picture, which "width", "height" and "FOURCC" describe. "chunk" must hold a whole picture
-// then, and formats other than BGR3 need the module "scaler".
+// then, and formats other than BGR3 need the module "scaler". "parallel" true: PNG pictures are packed on the
+// engine's pool of threads, several at once. Their files come in their order, but later than their units: a
+// failure stops the ring with the next unit, or is in ioError() after destroy(0); destroy(1) leaves out what
+// is not written yet.
 class QV_API QvBsSplitVideo : public QvBufStreamFifoCb {
   public:
     explicit QvBsSplitVideo(QvCodec* owner = nullptr);
@@ -47,6 +51,7 @@ class QV_API QvBsSplitVideo : public QvBufStreamFifoCb {
     bool writePicture(bufstream* ring, unsigned bytes, const Any& name);
     bool savePicture(const QvFrame& frame, const Any& name);
     bool writeFile(bufstream* ring, unsigned bytes, const Any& name);
+    void noteLost();
 
     TPtrList<QvAuxInfoObserver> observers_;
     int fileCounter_ = 0;
@@ -60,6 +65,7 @@ class QV_API QvBsSplitVideo : public QvBufStreamFifoCb {
     // To BGR3; null unless the pictures have another format.
     std::unique_ptr<QvColorConverter> converter_;
     std::unique_ptr<QvFrame> converted_;
+    std::unique_ptr<PictureQueue> queue_;  // null unless pictures are packed in parallel
 };
 
 // Parameters: "outfilename"; "isPcm" Int32 0 for a plain file, anything else for WAV; "split" true for one

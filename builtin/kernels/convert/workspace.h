@@ -1,6 +1,8 @@
 // The lines that a band works on: rings of the latest ones, by their number.
 #pragma once
 
+#include <algorithm>
+#include <bit>
 #include <cstdint>
 #include <cstdlib>
 #include <memory>
@@ -33,20 +35,22 @@ class Block {
     size_t count_ = 0;
 };
 
-// `slots` lines of `length` items. A line is found by its number until as many others have come.
+// At least `slots` lines of `length` items. A line is found by its number until as many others have come. The
+// places are a power of two: a division for each of the lines that a target line takes would cost as much as
+// the work on them.
 template <class T>
 class Ring {
   public:
     void set(int slots, int length) {
-        slots_ = slots;
+        slots_ = std::bit_ceil(static_cast<unsigned>(std::max(slots, 1)));
         length_ = (static_cast<size_t>(length) + 63) & ~size_t{63};
-        block_.grow(static_cast<size_t>(slots) * length_);
-        tags_.assign(static_cast<size_t>(slots), -1);
+        block_.grow(slots_ * length_);
+        tags_.assign(slots_, -1);
     }
     void forget() { std::fill(tags_.begin(), tags_.end(), -1); }
     // The place of line `y`; `fresh`: it must be filled.
     T* at(int y, bool& fresh) {
-        const auto slot = static_cast<size_t>(y % slots_);
+        const size_t slot = static_cast<size_t>(y) & (slots_ - 1);
         fresh = tags_[slot] != y;
         tags_[slot] = y;
         return block_.get() + slot * length_;
@@ -55,7 +59,7 @@ class Ring {
   private:
     Block<T> block_;
     std::vector<int> tags_;
-    int slots_ = 1;
+    size_t slots_ = 1;
     size_t length_ = 0;
 };
 

@@ -35,6 +35,8 @@ struct QvThreadPool::State {
     std::mutex lock;
     std::condition_variable wake;
     Job* open = nullptr;
+    Task* firstTask = nullptr;  // those that wait for a worker
+    Task** lastTask = &firstTask;
     bool stopping = false;
     int idle = 0;
     std::vector<std::thread> workers;
@@ -43,6 +45,8 @@ struct QvThreadPool::State {
     void workerLoop();
     Job* findJob() const;
     void close(Job& job);
+    void add(Task& task);
+    bool remove(Task& task);
 };
 
 // Newest first: a job inside a job is what its caller, itself a worker, waits for.
@@ -67,6 +71,13 @@ void QvThreadPool::State::workerLoop() {
     std::unique_lock hold(lock);
     while (true) {
         Job* const job = findJob();
+        if (Task* const task = job ? nullptr : firstTask) {
+            remove(*task);
+            hold.unlock();
+            task->call_(task->context_);
+            hold.lock();
+            continue;
+        }
         if (!job) {
             if (stopping) return;
             ++idle;
@@ -86,6 +97,23 @@ void QvThreadPool::State::close(Job& job) {
     Job** link = &open;
     while (*link != &job) link = &(*link)->below;
     *link = job.below;
+}
+
+void QvThreadPool::State::add(Task& task) {
+    task.next_ = nullptr;
+    task.waiting_ = true;
+    *lastTask = &task;
+    lastTask = &task.next_;
+}
+
+bool QvThreadPool::State::remove(Task& task) {
+    if (!task.waiting_) return false;
+    Task** link = &firstTask;
+    while (*link != &task) link = &(*link)->next_;
+    *link = task.next_;
+    if (lastTask == &task.next_) lastTask = link;
+    task.waiting_ = false;
+    return true;
 }
 
 QvThreadPool::QvThreadPool(int workers) : state_(std::make_unique<State>()) {
@@ -154,6 +182,21 @@ bool qvSetThreads(int threads) {
     if (threads < 0 || threads > kQvMostThreads || g_made) return false;
     g_threads = threads;
     return true;
+}
+
+bool QvThreadPool::start(Task& task) {
+    if (state_->workers.empty()) return false;
+    {
+        const std::lock_guard hold(state_->lock);
+        state_->add(task);
+    }
+    state_->wake.notify_one();
+    return true;
+}
+
+bool QvThreadPool::takeBack(Task& task) {
+    const std::lock_guard hold(state_->lock);
+    return state_->remove(task);
 }
 
 QvThreadPool& qvThreadPool() {

@@ -30,6 +30,29 @@ class QV_API QvThreadPool {
             const_cast<void*>(static_cast<const void*>(std::addressof(task))));
     }
 
+    // Work that its owner does not wait for where it starts it.
+    class Task {
+      public:
+        // `call` must not throw. `context` is borrowed.
+        Task(void (*call)(void* context), void* context) : call_(call), context_(context) {}
+        Task(const Task&) = delete;
+        Task& operator=(const Task&) = delete;
+
+      private:
+        friend class QvThreadPool;
+        void (*const call_)(void*);
+        void* const context_;
+        Task* next_ = nullptr;
+        bool waiting_ = false;
+    };
+
+    // A worker calls the task once, in the order of starts, when no parallelFor has parts left. The task must
+    // stay until its call has returned, or takeBack was true; it may be started again after either. False,
+    // and nothing is started, if there are no workers. Allocates nothing.
+    bool start(Task& task);
+    // True if no worker has begun the task, which is then no longer started.
+    bool takeBack(Task& task);
+
     // How many threads can work at once, the caller counted: the number of bands worth cutting.
     int width() const;
 

@@ -84,4 +84,74 @@ TEST(ThreadPool, TheNumberIsSetBeforeThePoolIsThere) {
     EXPECT_FALSE(qvSetThreads(2));
 }
 
+struct Counted {
+    std::mutex lock;
+    std::condition_variable changed;
+    int runs = 0;
+    bool closed = true;  // tasks wait
+
+    void run() {
+        std::unique_lock hold(lock);
+        changed.wait(hold, [this] { return !closed; });
+        ++runs;
+        changed.notify_all();
+    }
+    void open() {
+        const std::lock_guard hold(lock);
+        closed = false;
+        changed.notify_all();
+    }
+    void waitFor(int count) {
+        std::unique_lock hold(lock);
+        changed.wait(hold, [&] { return runs == count; });
+    }
+    static void call(void* counted) { static_cast<Counted*>(counted)->run(); }
+};
+
+// With its one worker busy the pool keeps tasks, and gives back those it is asked for, from any place of the
+// list.
+TEST(ThreadPool, TasksRunOnceUnlessTheyAreTakenBack) {
+    for (const int taken : {0, 1, 2}) {
+        Counted busy, counted;
+        QvThreadPool pool(1);
+        QvThreadPool::Task first(Counted::call, &busy), a(Counted::call, &counted),
+            b(Counted::call, &counted), c(Counted::call, &counted);
+        QvThreadPool::Task* const tasks[] = {&a, &b, &c};
+        counted.open();
+        EXPECT_TRUE(pool.start(first));
+        while (pool.takeBack(first)) {  // until the worker has it
+            pool.start(first);
+            std::this_thread::yield();
+        }
+        for (auto* task : tasks) EXPECT_TRUE(pool.start(*task));
+        EXPECT_TRUE(pool.takeBack(*tasks[taken]));
+        EXPECT_FALSE(pool.takeBack(*tasks[taken]));
+        EXPECT_FALSE(pool.takeBack(first)) << "it has begun";
+        busy.open();
+        counted.waitFor(2);
+        EXPECT_TRUE(pool.start(*tasks[taken]));
+        counted.waitFor(3);
+    }
+    NoThreads none;
+    const PlatformScope scope(none);
+    QvThreadPool alone(2);
+    Counted counted;
+    QvThreadPool::Task task(Counted::call, &counted);
+    EXPECT_FALSE(alone.start(task));
+    EXPECT_FALSE(alone.takeBack(task));
+}
+
+// A worker that a task keeps for long is not missed by parallelFor.
+TEST(ThreadPool, PartsDoNotWaitForTasks) {
+    Counted busy;
+    QvThreadPool pool(1);
+    QvThreadPool::Task task(Counted::call, &busy);
+    ASSERT_TRUE(pool.start(task));
+    std::atomic<int> runs{0};
+    pool.parallelFor(10, [&](int) { ++runs; });
+    EXPECT_EQ(runs, 10);
+    busy.open();
+    busy.waitFor(1);
+}
+
 }  // namespace
