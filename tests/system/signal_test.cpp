@@ -83,10 +83,9 @@ TEST_F(Signal, TheSecondEndsAtOnce) {
     while (write(full[1], page.data(), page.size()) > 0) {
     }
     fcntl(full[1], F_SETFL, 0);
-    const std::string line =
-        "exec '" + program() + "' transcode " + kEndless +
-        " -o out.raw --save-task t.xml --filter rawdump:filename=dump --progress json 2>&" +
-        std::to_string(full[1]);
+    const std::string line = "exec '" + program() + "' transcode " + kEndless +
+                             " -o out.raw --save-task t.xml --filter rawdump:filename=dump 2>&" +
+                             std::to_string(full[1]);
     Process run({"sh", "-c", line}, here());
     ASSERT_TRUE(comes([&] { return listing().size() >= 2; }));
     for (int i = 0; i < 2; ++i) {
@@ -109,7 +108,10 @@ TEST_F(Signal, TheSecondEndsTheCommandOfPost) {
     run.signal(SIGINT);
     const Outcome o = run.finish();
     EXPECT_EQ(o.status, 130);
-    EXPECT_THAT(o.err, testing::HasSubstr("stopped in the command of --post: it got the signal and has ended; 'out.raw' is complete\n"));
+    EXPECT_THAT(
+        o.err,
+        testing::HasSubstr(
+            "stopped in the command of --post: it got the signal and has ended; 'out.raw' is complete\n"));
 }
 
 // A pipe that nobody has opened, or that nobody reads, holds nothing up, whatever it is for.
@@ -198,7 +200,8 @@ TEST_F(Signal, OnRequestTheStateOfPost) {
         Process run(words(job + (json ? Words{"--progress", "json"} : Words{})), here());
         ASSERT_TRUE(run.waitFor("started"));
         run.signal(SIGUSR1);
-        EXPECT_TRUE(run.waitFor(json ? "\"the command of --post is running\"}" : "tarsel: the command of --post is running\n"));
+        EXPECT_TRUE(run.waitFor(json ? "\"the command of --post is running\"}"
+                                     : "tarsel: the command of --post is running\n"));
         run.signal(SIGTERM);
         EXPECT_EQ(run.finish().status, 143);
     }
