@@ -43,7 +43,7 @@ constexpr QvBuiltinRow registered[] = {
     {"testgen",      decoder,      "Test stream generator",          "Test input",                 newTestgen,
      {.exts = "", .priority = 10, .skipAuto = true, .internal = true}},
     {"chconvert",    audioFilter,  "Audio channel number converter", "Channel mapping",            nullptr},
-    {"aquant",       audioFilter,  "Audio quantization converter",   "Change sample format",       nullptr},
+    {"aquant",       audioFilter,  "Audio quantization converter",   "Change sample format",       newAquant},
     {"aprocess",     audioPipe,    "Audio processing pipe",          "Audio processing pipe",      newAprocess},
     {"avol",         audioFilter,  "Audio volume",                   "Audio volume",               nullptr},
     {"rawdump",      videoFilter,  "Raw frame dump (debug)",         "Raw frame dump (debug)",     newRawdump},

@@ -38,3 +38,4 @@ QvCodec* newTimecode();
 QvCodec* newSubtitle();
 QvCodec* newFrconvert();
 QvCodec* newBobber();
+QvCodec* newAquant();
