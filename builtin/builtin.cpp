@@ -42,7 +42,7 @@ constexpr QvBuiltinRow registered[] = {
      {.exts = "sub srt", .priority = 10}},
     {"testgen",      decoder,      "Test stream generator",          "Test input",                 newTestgen,
      {.exts = "", .priority = 10, .skipAuto = true, .internal = true}},
-    {"chconvert",    audioFilter,  "Audio channel number converter", "Channel mapping",            nullptr},
+    {"chconvert",    audioFilter,  "Audio channel number converter", "Channel mapping",            newChconvert},
     {"aquant",       audioFilter,  "Audio quantization converter",   "Change sample format",       newAquant},
     {"aprocess",     audioPipe,    "Audio processing pipe",          "Audio processing pipe",      newAprocess},
     {"avol",         audioFilter,  "Audio volume",                   "Audio volume",               nullptr},

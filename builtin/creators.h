@@ -38,4 +38,5 @@ QvCodec* newTimecode();
 QvCodec* newSubtitle();
 QvCodec* newFrconvert();
 QvCodec* newBobber();
+QvCodec* newChconvert();
 QvCodec* newAquant();
