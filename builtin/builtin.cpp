@@ -45,7 +45,7 @@ constexpr QvBuiltinRow registered[] = {
     {"chconvert",    audioFilter,  "Audio channel number converter", "Channel mapping",            newChconvert},
     {"aquant",       audioFilter,  "Audio quantization converter",   "Change sample format",       newAquant},
     {"aprocess",     audioPipe,    "Audio processing pipe",          "Audio processing pipe",      newAprocess},
-    {"avol",         audioFilter,  "Audio volume",                   "Audio volume",               nullptr},
+    {"avol",         audioFilter,  "Audio volume",                   "Audio volume",               newAvol},
     {"rawdump",      videoFilter,  "Raw frame dump (debug)",         "Raw frame dump (debug)",     newRawdump},
     {"brightness",   videoFilter,  "Brightness/contrast/gamma",      "Brightness/contrast/gamma",  newBrightness},
     {"animatedlogo", videoFilter,  "Animated logo",                  "Animated logo",              newAnimatedlogo},

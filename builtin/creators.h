@@ -40,3 +40,4 @@ QvCodec* newFrconvert();
 QvCodec* newBobber();
 QvCodec* newChconvert();
 QvCodec* newAquant();
+QvCodec* newAvol();
