@@ -32,7 +32,7 @@ constexpr QvBuiltinRow registered[] = {
      {.inFourcc = "BGR4 BGR3 I420 YUY2 YV12 Y216"}},
     {"rawaenc",      audioEncoder, "RAW Wave audio encoder module",  "RAW Wave Audio",             newRawaenc},
     {"frconvert",    videoFilter,  "Framerate converter",            "Change framerate",           newFrconvert},
-    {"srconvert",    audioFilter,  "Samplerate converter",           "Change samplerate",          nullptr},
+    {"srconvert",    audioFilter,  "Samplerate converter",           "Change samplerate",          newSrconvert},
     {"deinterlace",  videoFilter,  "Field deinterlace",              "Deinterlace",                newDeinterlace},
     {"logo",         videoFilter,  "Insert logo into frame",         "Logo",                       newLogo},
     {"bobber",       videoFilter,  "Auto bob",                       "Auto bob",                   newBobber},
