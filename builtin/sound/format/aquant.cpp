@@ -2,7 +2,6 @@
 
 #include <algorithm>
 #include <array>
-#include <climits>
 #include <cstring>
 
 #include "builtin/creators.h"
@@ -17,12 +16,15 @@ using Settings = AquantSettings;
 constexpr std::array ditherNames{"none", "triangular"};
 
 constexpr QvParamRow<Settings> rows[] = {
-    {"outBitsPerSample", &Settings::outBits, qvParamStored, INT_MIN, INT_MAX, "", "bits",
-     "8, 16, 20, 24 or 32; 20 and 24 take 3 bytes"},
+    {.name = "outBitsPerSample",
+     .member = &Settings::outBits,
+     .flags = qvParamStored,
+     .unit = "bits",
+     .help = "8, 16, 20, 24 or 32; 20 and 24 take 3 bytes"},
     {.name = "dither",
      .member = wordParam<Settings, &Settings::dither, ditherNames>,
      .flags = qvParamStored,
-     .help = "none; triangular: noise before rounding to 8 or 16 bits"},
+     .help = "none or triangular (noise before rounding to 8 or 16 bits)"},
 };
 static_assert(qvParamTableOk<Settings>(rows));
 

@@ -54,8 +54,9 @@ constexpr QvParamRow<S> rows[] = {
     {"channel7_mute",   &S::mute7,   qvParamStored, 0, 1, "Channel 7 mute"},
     {"channel8_mute",   &S::mute8,   qvParamStored, 0, 1, "Channel 8 mute"},
     {.name = "precision", .member = QvParamAccess<S>{setPrecision, getPrecision}, .flags = qvParamStored,
-     .unit = "bits", .help = "5: gains up to 6 dB that wrap around; 16: up to 48 dB, values are limited"},
-    {.name = "_streamReport", .member = QvParamAccess<S>{takeReport, nullptr}, .type = Any::Dict},
+     .unit = "bits", .help = "5 (gains up to 6 dB, which wrap around) or 16 (up to 48 dB, values are limited)"},
+    {.name = "_streamReport", .member = QvParamAccess<S>{takeReport, nullptr}, .help = "a dictionary",
+     .type = Any::Dict},
     {.name = "_needsReport", .flags = qvParamByHand | qvParamReadOnly, .type = Any::Int32},
 };
 // clang-format on

@@ -7,6 +7,14 @@
 template <class Settings>
 class FormatFilterOf : public SoundFilterOf<Settings> {
   public:
+    // A value that a row with its own rules refuses is answered with the help of the row.
+    int setParam(const char* name, const Any& value) override {
+        const int result = SoundFilterOf<Settings>::setParam(name, value);
+        const auto* row = qvFindParamRow<Settings>(this->rows_, name);
+        if (result != QvStatus::invalidParam || !row || qvparam::kindOfRow(*row) != qvparam::Kind::special)
+            return result;
+        return this->setError(result, "'%s' takes %s", name, row->help);
+    }
     // Of the rows marked qvParamStored those whose value is not that of a new filter.
     void store(AnyDict& dict) const override {
         SoundFilter::store(dict);

@@ -29,23 +29,22 @@ double besselI0(double x) {
 }
 
 // The right half of the sinc, from its middle on.
-std::vector<int32_t> makeSinc(double cutoff) {
-    std::vector<int32_t> sinc(side + 1);
-    sinc[0] = static_cast<int32_t>(std::floor(cutoff * one + 0.1));
+std::vector<double> makeSinc(double cutoff) {
+    std::vector<double> sinc(side + 1);
+    sinc[0] = std::floor(cutoff * one + 0.1);
     const double atMiddle = besselI0(beta);
     for (int i = 1; i < side; ++i) {
         const double place = static_cast<double>(i) / (side - 1);
         const double window = besselI0(beta * std::sqrt(1 - place * place)) / atMiddle;
         const double x = i * std::numbers::pi / Resampler::phases;
-        sinc[static_cast<size_t>(i)] =
-            static_cast<int32_t>(std::lround(std::sin(x * cutoff) / x * window * one));
+        sinc[static_cast<size_t>(i)] = std::round(std::sin(x * cutoff) / x * window * one);
     }
     return sinc;  // the last one stays 0: it is reached by the last tap of phase 0 only
 }
 
-std::vector<int32_t> makeTable(double cutoff) {
+std::vector<double> makeTable(double cutoff) {
     const auto sinc = makeSinc(cutoff);
-    std::vector<int32_t> table;
+    std::vector<double> table;
     for (int phase = 0; phase < Resampler::phases; ++phase)
         for (int tap = 0; tap < Resampler::taps; ++tap) {
             const int place = (tap - Resampler::leftReach) * Resampler::phases - phase;
@@ -73,7 +72,7 @@ Resampler::Resampler(int inChannels, int outChannels, int inRate, int outRate)
     QV_ASSERT(inRate >= 1 && outRate >= 1 && inRate <= maxRate && outRate <= maxRate && inRate != outRate);
     QV_ASSERT(inChannels >= 1 && (inChannels == outChannels || inChannels + outChannels == 3));
     table_ = makeTable(outRate < inRate ? rolloff * outRate / inRate : 1.0);
-    for (const int32_t tap : table_) doubled_.insert(doubled_.end(), 2, tap);
+    for (const double tap : table_) doubled_.insert(doubled_.end(), 2, tap);
     walk_ = makeWalk(inRate, outRate);
 }
 
@@ -89,14 +88,13 @@ long long RateNeed::viewFor(long long n) const {
     return std::max(inputFor(n) + Resampler::taps, n * inRate / outRate + around);
 }
 
-void Resampler::makeOne(const int32_t* view, long long count, int32_t* out) const {
+void Resampler::makeOne(const double* view, long long count, int32_t* out) const {
     const long long start = walk_.index - leftReach;
     const auto first = std::max(0LL, -start), last = std::min<long long>(taps, count - start);
-    const int32_t* tap = &table_[static_cast<size_t>(walk_.phase) * taps];
+    const double* tap = &table_[static_cast<size_t>(walk_.phase) * taps];
     const auto sumOf = [&](int channel) {
-        int64_t sum = 0;
-        for (long long k = first; k < last; ++k)
-            sum += int64_t{tap[k]} * view[(start + k) * inChannels_ + channel];
+        double sum = 0;
+        for (long long k = first; k < last; ++k) sum += tap[k] * view[(start + k) * inChannels_ + channel];
         return sum;
     };
     if (inChannels_ > outChannels_) {
@@ -106,7 +104,7 @@ void Resampler::makeOne(const int32_t* view, long long count, int32_t* out) cons
     for (int c = 0; c < outChannels_; ++c) out[c] = rounded<14>(sumOf(std::min(c, inChannels_ - 1)));
 }
 
-void Resampler::make(const int32_t* view, long long count, int32_t* out, int n) {
+void Resampler::make(const double* view, long long count, int32_t* out, int n) {
     const RateTaps taps16{table_.data(), doubled_.data()};
     const RateRun run{view, leftReach, count - rightReach, inChannels_, outChannels_};
     for (int done = 0; done < n;) {
@@ -117,7 +115,7 @@ void Resampler::make(const int32_t* view, long long count, int32_t* out, int n) 
     }
 }
 
-int Resampler::makeAll(const int32_t* view, long long count, int32_t* out, int n) {
+int Resampler::makeAll(const double* view, long long count, int32_t* out, int n) {
     RateWalk ahead = walk_;
     int usable = 0;
     for (ahead.advance(); usable < n && ahead.index < count; ahead.advance()) ++usable;

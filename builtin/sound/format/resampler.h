@@ -1,5 +1,6 @@
 // The rate converter of standard quality: a windowed sinc of 16 taps in 64 phases, without interpolation
-// between phases, in integers.
+// between phases, in whole numbers. They are kept as doubles, which hold them exactly: a tap has 15 bits, a
+// sample 32, and 16 products are added.
 //
 // An output sample lies at input position p + phase / 64 and is the sum over the input samples p - 7 to p +
 // 8, weighted by the taps of its phase. Positions count from the first sample of the view that a call is
@@ -62,22 +63,22 @@ class Resampler {
     RateNeed need() const { return {inRate_, outRate_}; }
 
     // Makes n output samples of a view of `count` input samples.
-    void make(const int32_t* view, long long count, int32_t* out, int n);
+    void make(const double* view, long long count, int32_t* out, int n);
     // Makes output samples up to the last input sample, at most n. Returns how many.
-    int makeAll(const int32_t* view, long long count, int32_t* out, int n);
+    int makeAll(const double* view, long long count, int32_t* out, int n);
     // How many samples of the view are no longer needed. Seven samples stay as history.
     long long consume();
 
     // 1024 taps, 16 of each phase together. The tap of sample p - 7 comes first.
-    const std::vector<int32_t>& table() const { return table_; }
+    const std::vector<double>& table() const { return table_; }
 
   private:
-    void makeOne(const int32_t* view, long long count, int32_t* out) const;
+    void makeOne(const double* view, long long count, int32_t* out) const;
 
     int inChannels_, outChannels_, inRate_, outRate_;
     RateWalk walk_;
-    std::vector<int32_t> table_;
-    std::vector<int32_t> doubled_;  // each tap twice, for two channels
+    std::vector<double> table_;
+    std::vector<double> doubled_;  // each tap twice, for two channels
 };
 
 }  // namespace snd

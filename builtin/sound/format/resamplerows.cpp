@@ -13,6 +13,9 @@ namespace hn = hwy::HWY_NAMESPACE;
 
 constexpr int tapCount = Resampler::taps;
 
+// Samples, taps, and the taps twice each.
+using In = const double*;
+
 // Calls put(out, first sample, taps, doubled taps) for each output sample inside the run.
 template <class Put>
 HWY_INLINE int walkRun(const RateRun& run, const RateTaps& taps, RateWalk& walk, int32_t* HWY_RESTRICT out,
@@ -24,9 +27,9 @@ HWY_INLINE int walkRun(const RateRun& run, const RateTaps& taps, RateWalk& walk,
         next.advance();
         if (next.index < run.begin || next.index >= run.end) break;
         latest = next;
-        const int32_t* first = run.in + (next.index - Resampler::leftReach) * run.inChannels;
-        const int32_t* table = taps.table + next.phase * tapCount;
-        put(out, first, table, taps.doubled + 2 * next.phase * tapCount);
+        const int place = next.phase * tapCount;
+        put(out, run.in + (next.index - Resampler::leftReach) * run.inChannels, taps.table + place,
+            taps.doubled + 2 * place);
         out += run.outChannels;
     }
     walk = latest;
@@ -35,82 +38,91 @@ HWY_INLINE int walkRun(const RateRun& run, const RateTaps& taps, RateWalk& walk,
 
 #if HWY_TARGET == HWY_SCALAR || HWY_TARGET == HWY_EMU128
 
-HWY_INLINE int64_t sumOf(const int32_t* in, int channels, const int32_t* taps) {
-    int64_t sum = 0;
-    for (int k = 0; k < tapCount; ++k) sum += int64_t{taps[k]} * in[k * channels];
+HWY_INLINE double sumOf(In in, int channels, In taps) {
+    double sum = 0;
+    for (int k = 0; k < tapCount; ++k) sum += taps[k] * in[k * channels];
     return sum;
 }
 
-struct Pair {
-    int64_t left, right;
-};
-HWY_INLINE Pair sumsOfTwo(const int32_t* in, const int32_t* taps, const int32_t*) {
-    return {sumOf(in, 2, taps), sumOf(in + 1, 2, taps)};
-}
-HWY_INLINE int64_t sumOfOne(const int32_t* in, const int32_t* taps) { return sumOf(in, 1, taps); }
+HWY_INLINE void one(int32_t* out, In in, In taps) { out[0] = rounded<14>(sumOf(in, 1, taps)); }
 
-HWY_INLINE void manySums(int32_t* out, const int32_t* in, int channels, const int32_t* taps) {
+HWY_INLINE void two(int32_t* out, In in, In taps) {
+    out[0] = rounded<14>(sumOf(in, 2, taps));
+    out[1] = rounded<14>(sumOf(in + 1, 2, taps));
+}
+
+HWY_INLINE void mixed(int32_t* out, In in, In taps) {
+    out[0] = rounded<15>(sumOf(in, 2, taps) + sumOf(in + 1, 2, taps));
+}
+
+HWY_INLINE void many(int32_t* out, In in, int channels, In taps) {
     for (int c = 0; c < channels; ++c) out[c] = rounded<14>(sumOf(in + c, channels, taps));
 }
 
 #else
 
-const hn::CappedTag<int32_t, 8> d32;
-const hn::RepartitionToWide<decltype(d32)> d64;
-constexpr int lanes = hn::MaxLanes(hn::CappedTag<int32_t, 8>());
-using V32 = hn::Vec<hn::CappedTag<int32_t, 8>>;
-using V64 = hn::Vec<hn::RepartitionToWide<hn::CappedTag<int32_t, 8>>>;
+const hn::CappedTag<double, 4> d;
+const hn::FixedTag<double, 2> d2;
+using D = hn::CappedTag<double, 4>;
+using V = hn::Vec<D>;
+constexpr int lanes = hn::MaxLanes(D());
 
-// The values of odd lanes in the place of the even ones.
-HWY_INLINE V32 odds(V32 v) {
-    const hn::RebindToUnsigned<decltype(d64)> du64;
-    return hn::BitCast(d32, hn::ShiftRight<32>(hn::BitCast(du64, v)));
+// The products of values and taps that lie in the same order, added up in each lane.
+template <int count>
+HWY_INLINE V products(In in, In taps) {
+    V even = hn::Zero(d), odd = even;
+    for (int k = 0; k < count; k += 2 * lanes) {
+        even = hn::MulAdd(hn::LoadU(d, in + k), hn::LoadU(d, taps + k), even);
+        odd = hn::MulAdd(hn::LoadU(d, in + k + lanes), hn::LoadU(d, taps + k + lanes), odd);
+    }
+    return hn::Add(even, odd);
 }
 
-struct Pair {
-    int64_t left, right;
-};
-HWY_INLINE Pair sumsOfTwo(const int32_t* in, const int32_t*, const int32_t* doubled) {
-    V64 left = hn::Zero(d64), right = left;
-    for (int k = 0; k < 2 * tapCount; k += lanes) {
-        const V32 value = hn::LoadU(d32, in + k), tap = hn::LoadU(d32, doubled + k);
-        left = hn::Add(left, hn::MulEven(value, tap));
-        right = hn::Add(right, hn::MulEven(odds(value), tap));
-    }
-    HWY_ALIGN int64_t sums[lanes / 2];
-    hn::Store(hn::Add(hn::InterleaveLower(d64, left, right), hn::InterleaveUpper(d64, left, right)), d64,
-              sums);
-    Pair pair{0, 0};
-    for (int k = 0; k < lanes / 2; k += 2) {
-        pair.left += sums[k];
-        pair.right += sums[k + 1];
-    }
-    return pair;
+// The lanes of even and those of odd places added up.
+HWY_INLINE hn::Vec<decltype(d2)> toTwo(V sums) {
+#if HWY_TARGET <= HWY_AVX2
+    return hn::Add(hn::LowerHalf(d2, sums), hn::UpperHalf(d2, sums));
+#else
+    return sums;
+#endif
 }
 
-HWY_INLINE int64_t sumOfOne(const int32_t* in, const int32_t* taps) {
-    V64 sum = hn::Zero(d64);
-    for (int k = 0; k < tapCount; k += lanes) {
-        const V32 value = hn::LoadU(d32, in + k), tap = hn::LoadU(d32, taps + k);
-        sum = hn::Add(sum, hn::Add(hn::MulEven(value, tap), hn::MulEven(odds(value), odds(tap))));
-    }
-    return hn::GetLane(hn::SumOfLanes(d64, sum));
+// As rounded(), lane by lane.
+template <int shift, class Tag>
+HWY_INLINE auto roundedLanes(Tag tag, hn::Vec<Tag> sums) {
+    constexpr double unit = 1 << shift;
+    const auto moved = hn::Add(sums, hn::Set(tag, unit / 2 - 1));
+    const auto whole = hn::Floor(hn::Mul(moved, hn::Set(tag, 1 / unit)));
+    const auto bounded = hn::Min(hn::Max(whole, hn::Set(tag, INT32_MIN)), hn::Set(tag, INT32_MAX));
+    return hn::DemoteTo(hn::Rebind<int32_t, Tag>(), bounded);
+}
+
+HWY_INLINE void two(int32_t* out, In in, In doubled) {
+    const auto sums = toTwo(products<2 * tapCount>(in, doubled));
+    hn::StoreU(roundedLanes<14>(d2, sums), hn::Rebind<int32_t, decltype(d2)>(), out);
+}
+
+HWY_INLINE void mixed(int32_t* out, In in, In doubled) {
+    const auto sums = toTwo(products<2 * tapCount>(in, doubled));
+    out[0] = hn::GetLane(roundedLanes<15>(d2, hn::SumOfLanes(d2, sums)));
+}
+
+HWY_INLINE void one(int32_t* out, In in, In taps) {
+    const auto sums = toTwo(products<tapCount>(in, taps));
+    out[0] = hn::GetLane(roundedLanes<14>(d2, hn::SumOfLanes(d2, sums)));
 }
 
 // As many channels at a time as there are lanes. The last ones read into what follows.
-HWY_INLINE void manySums(int32_t* out, const int32_t* in, int channels, const int32_t* taps) {
+HWY_INLINE void many(int32_t* out, In in, int channels, In taps) {
     for (int c = 0; c < channels; c += lanes) {
-        V64 even = hn::Zero(d64), odd = even;
-        for (int k = 0; k < tapCount; ++k) {
-            const V32 value = hn::LoadU(d32, in + k * channels + c), tap = hn::Set(d32, taps[k]);
-            even = hn::Add(even, hn::MulEven(value, tap));
-            odd = hn::Add(odd, hn::MulEven(odds(value), tap));
+        V even = hn::Zero(d), odd = even;
+        for (int k = 0; k < tapCount; k += 2) {
+            even = hn::MulAdd(hn::LoadU(d, in + k * channels + c), hn::Set(d, taps[k]), even);
+            odd = hn::MulAdd(hn::LoadU(d, in + (k + 1) * channels + c), hn::Set(d, taps[k + 1]), odd);
         }
-        HWY_ALIGN int64_t evens[lanes / 2], odds64[lanes / 2];
-        hn::Store(even, d64, evens);
-        hn::Store(odd, d64, odds64);
-        for (int k = 0; k < std::min(lanes, channels - c); ++k)
-            out[c + k] = rounded<14>(k % 2 ? odds64[k / 2] : evens[k / 2]);
+        HWY_ALIGN int32_t values[lanes];
+        hn::Store(roundedLanes<14>(d, hn::Add(even, odd)), hn::Rebind<int32_t, D>(), values);
+        for (int k = 0; k < std::min(lanes, channels - c); ++k) out[c + k] = values[k];
     }
 }
 
@@ -118,25 +130,22 @@ HWY_INLINE void manySums(int32_t* out, const int32_t* in, int channels, const in
 
 int makeInside(const RateRun& run, const RateTaps& taps, RateWalk& walk, int32_t* out, int n) {
     const auto walked = [&](auto put) HWY_ATTR { return walkRun(run, taps, walk, out, n, put); };
-    using In = const int32_t*;
+    constexpr bool plain = HWY_TARGET == HWY_SCALAR || HWY_TARGET == HWY_EMU128;
+    const auto order = [](In table, In doubled) HWY_ATTR { return plain ? table : doubled; };
     if (run.inChannels == 1 && run.outChannels == 1)
-        return walked([](int32_t* to, In in, In tap, In)
-                          HWY_ATTR { to[0] = rounded<14>(sumOfOne(in, tap)); });
+        return walked([](int32_t* to, In in, In table, In) HWY_ATTR { one(to, in, table); });
     if (run.inChannels == 1)
-        return walked([](int32_t* to, In in, In tap, In)
-                          HWY_ATTR { to[0] = to[1] = rounded<14>(sumOfOne(in, tap)); });
+        return walked([](int32_t* to, In in, In table, In) HWY_ATTR {
+            one(to, in, table);
+            to[1] = to[0];
+        });
     if (run.inChannels == 2 && run.outChannels == 1)
-        return walked([](int32_t* to, In in, In tap, In doubled) HWY_ATTR {
-            const Pair sums = sumsOfTwo(in, tap, doubled);
-            to[0] = rounded<15>(sums.left + sums.right);
-        });
+        return walked([=](int32_t* to, In in, In table, In doubled)
+                          HWY_ATTR { mixed(to, in, order(table, doubled)); });
     if (run.inChannels == 2)
-        return walked([](int32_t* to, In in, In tap, In doubled) HWY_ATTR {
-            const Pair sums = sumsOfTwo(in, tap, doubled);
-            to[0] = rounded<14>(sums.left);
-            to[1] = rounded<14>(sums.right);
-        });
-    return walked([&](int32_t* to, In in, In tap, In) HWY_ATTR { manySums(to, in, run.inChannels, tap); });
+        return walked([=](int32_t* to, In in, In table, In doubled)
+                          HWY_ATTR { two(to, in, order(table, doubled)); });
+    return walked([&](int32_t* to, In in, In table, In) HWY_ATTR { many(to, in, run.inChannels, table); });
 }
 
 }  // namespace HWY_NAMESPACE

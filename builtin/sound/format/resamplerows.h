@@ -3,6 +3,7 @@
 #pragma once
 
 #include <algorithm>
+#include <cmath>
 #include <cstddef>
 #include <cstdint>
 
@@ -13,20 +14,21 @@ namespace snd {
 // A sum with `shift` fraction bits as a value: halves are rounded down, and what is out of range takes the
 // nearest bound.
 template <int shift>
-int32_t rounded(int64_t sum) {
-    constexpr int64_t justBelowHalf = (int64_t{1} << (shift - 1)) - 1;
-    return static_cast<int32_t>(std::clamp<int64_t>((sum + justBelowHalf) >> shift, INT32_MIN, INT32_MAX));
+int32_t rounded(double sum) {
+    constexpr double one = 1 << shift, justBelowHalf = one / 2 - 1;
+    return static_cast<int32_t>(
+        std::clamp<double>(std::floor((sum + justBelowHalf) / one), INT32_MIN, INT32_MAX));
 }
 
 struct RateTaps {
-    const int32_t* table;    // as Resampler::table
-    const int32_t* doubled;  // each tap twice
+    const double* table;    // as Resampler::table
+    const double* doubled;  // each tap twice
 };
 
 // Input samples in a row, and the positions from `begin` to before `end` whose 16 samples are all there.
 // Resampler::padding values after those samples may be read.
 struct RateRun {
-    const int32_t* in;
+    const double* in;
     int64_t begin, end;
     int inChannels, outChannels;
 };

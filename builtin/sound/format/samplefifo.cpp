@@ -13,7 +13,7 @@ namespace {
 
 constexpr std::size_t alignment = 64;
 
-std::size_t bytesOf(long long values) { return static_cast<std::size_t>(values) * sizeof(int32_t); }
+std::size_t bytesOf(long long values) { return static_cast<std::size_t>(values) * sizeof(double); }
 
 }  // namespace
 
@@ -24,7 +24,7 @@ bool SampleFifo::reserve(long long samples) {
     if (samples > std::numeric_limits<int>::max() / channels_) return false;
     const long long capacity = std::max(samples, capacity_ + capacity_ / 2);
     const std::size_t bytes = bytesOf(capacity * channels_ + padding_);
-    auto* memory = static_cast<int32_t*>(qv_platform().allocate(bytes, alignment));
+    auto* memory = static_cast<double*>(qv_platform().allocate(bytes, alignment));
     if (!memory) return false;
     if (samples_ > 0) std::memcpy(memory, view(), bytesOf(samples_ * channels_));
     qv_platform().release(memory_);
@@ -40,8 +40,7 @@ void SampleFifo::append(const int32_t* from, long long samples) {
         std::memmove(memory_, view(), bytesOf(samples_ * channels_));
         head_ = 0;
     }
-    if (samples > 0)
-        std::memcpy(memory_ + (head_ + samples_) * channels_, from, bytesOf(samples * channels_));
+    std::copy_n(from, samples * channels_, memory_ + (head_ + samples_) * channels_);
     samples_ += samples;
 }
 

@@ -19,6 +19,11 @@ static_assert(std::endian::native == std::endian::little, "samples are stored as
 
 constexpr int32_t low24 = -(1 << 23), high24 = (1 << 23) - 1;
 
+// As std::clamp, by value: a choice between references keeps loops from becoming vectors.
+HWY_INLINE int32_t bound(int32_t value, int32_t low, int32_t high) {
+    return value < low ? low : value > high ? high : value;
+}
+
 // Plain loops that compilers turn into vectors of each unit.
 
 void widen8(int32_t* HWY_RESTRICT to, const unsigned char* HWY_RESTRICT from, size_t count) {
@@ -36,7 +41,7 @@ void widen16(int32_t* HWY_RESTRICT to, const unsigned char* HWY_RESTRICT from, s
 bool narrow8(unsigned char* HWY_RESTRICT to, const int32_t* HWY_RESTRICT from, size_t count) {
     int32_t clipped = 0;
     for (size_t i = 0; i < count; ++i) {
-        const int32_t value = from[i] >> 16, bounded = std::clamp(value, -128, 127);
+        const int32_t value = from[i] >> 16, bounded = bound(value, -128, 127);
         clipped |= value ^ bounded;
         to[i] = static_cast<unsigned char>(bounded + 128);
     }
@@ -46,7 +51,7 @@ bool narrow8(unsigned char* HWY_RESTRICT to, const int32_t* HWY_RESTRICT from, s
 bool narrow16(unsigned char* HWY_RESTRICT to, const int32_t* HWY_RESTRICT from, size_t count) {
     int32_t clipped = 0;
     for (size_t i = 0; i < count; ++i) {
-        const int32_t value = from[i] >> 8, bounded = std::clamp(value, -32768, 32767);
+        const int32_t value = from[i] >> 8, bounded = bound(value, -32768, 32767);
         clipped |= value ^ bounded;
         const auto narrow = static_cast<int16_t>(bounded);
         std::memcpy(to + 2 * i, &narrow, 2);
@@ -65,29 +70,32 @@ HWY_INLINE int32_t noiseAt(uint32_t place, int bits) {
     return static_cast<int32_t>((x & 0xFFFF) >> (16 - bits)) - static_cast<int32_t>(x >> (32 - bits));
 }
 
-template <int bits, class Put>
-HWY_INLINE bool dithered(const int32_t* HWY_RESTRICT from, size_t count, uint32_t place, Put put) {
+template <int bits>
+HWY_INLINE bool dithered(unsigned char* HWY_RESTRICT to, const int32_t* HWY_RESTRICT from, size_t count,
+                         uint32_t place) {
     constexpr int32_t low = low24 >> bits, high = high24 >> bits, half = 1 << (bits - 1);
     int32_t clipped = 0;
     for (size_t i = 0; i < count; ++i) {
-        const int32_t bounded = std::clamp(from[i], low24, high24);
-        clipped |= from[i] ^ bounded;
+        const int32_t was = from[i], bounded = bound(was, low24, high24);
+        clipped |= was ^ bounded;
         const int32_t moved = (bounded + half + noiseAt(place + static_cast<uint32_t>(i), bits)) >> bits;
-        put(i, std::clamp(moved, low, high));
+        const int32_t value = bound(moved, low, high);
+        if constexpr (bits == 16) {
+            to[i] = static_cast<unsigned char>(value + 128);
+        } else {
+            const auto narrow = static_cast<int16_t>(value);
+            std::memcpy(to + 2 * i, &narrow, 2);
+        }
     }
     return clipped != 0;
 }
 
-bool dither8(unsigned char* HWY_RESTRICT to, const int32_t* from, size_t count, uint32_t place) {
-    return dithered<16>(from, count, place,
-                        [=](size_t i, int32_t value) { to[i] = static_cast<unsigned char>(value + 128); });
+bool dither8(unsigned char* to, const int32_t* from, size_t count, uint32_t place) {
+    return dithered<16>(to, from, count, place);
 }
 
-bool dither16(unsigned char* HWY_RESTRICT to, const int32_t* from, size_t count, uint32_t place) {
-    return dithered<8>(from, count, place, [=](size_t i, int32_t value) {
-        const auto narrow = static_cast<int16_t>(value);
-        std::memcpy(to + 2 * i, &narrow, 2);
-    });
+bool dither16(unsigned char* to, const int32_t* from, size_t count, uint32_t place) {
+    return dithered<8>(to, from, count, place);
 }
 
 template <class Multiply>
@@ -157,7 +165,7 @@ bool narrow24(unsigned char* HWY_RESTRICT to, const int32_t* HWY_RESTRICT from, 
     clipped = hn::AllFalse(ints4, hn::Ne(differences, hn::Zero(ints4))) ? 0 : 1;
 #endif
     for (; i < count; ++i) {
-        const int32_t bounded = std::clamp(from[i], low24, high24);
+        const int32_t bounded = bound(from[i], low24, high24);
         clipped |= from[i] ^ bounded;
         std::memcpy(to + 3 * i, &bounded, 3);
     }

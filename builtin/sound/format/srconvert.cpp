@@ -21,14 +21,16 @@ constexpr std::array qualityNames{"standard", "high"};
 
 // clang-format off
 constexpr QvParamRow<Settings> rows[] = {
-    {"inSamplerate", &Settings::inRate, qvParamStored, 0, INT_MAX, "", "Hz", "rate of the input"},
-    {"outSamplerate", &Settings::outRate, qvParamStored, 0, INT_MAX, "", "Hz", "rate of the output"},
-    {"splsToGet", &Settings::batch, qvParamPlain, 0, INT_MAX, "", "samples",
-     "output is made in batches of so many; 0: all that the free room of the output takes"},
+    {.name = "inSamplerate", .member = &Settings::inRate, .flags = qvParamStored, .min = 0, .unit = "Hz",
+     .help = "rate of the input"},
+    {.name = "outSamplerate", .member = &Settings::outRate, .flags = qvParamStored, .min = 0, .unit = "Hz",
+     .help = "rate of the output"},
+    {.name = "splsToGet", .member = &Settings::batch, .min = 0, .unit = "samples",
+     .help = "output is made in batches of so many; 0: all that the free room of the output takes"},
     {.name = "splsNeed", .flags = qvParamByHand | qvParamReadOnly, .unit = "samples",
      .help = "further input for one batch, while the filter is open", .type = Any::Int32},
     {.name = "quality", .member = wordParam<Settings, &Settings::quality, qualityNames>, .flags = qvParamStored,
-     .help = "standard: 16 taps, integers; high: libsoxr"},
+     .help = "standard (16 taps, integers) or high (libsoxr)"},
 };
 // clang-format on
 static_assert(qvParamTableOk<Settings>(rows));

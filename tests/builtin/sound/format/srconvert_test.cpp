@@ -145,7 +145,8 @@ TEST(Srconvert, SumsArePinned) {
 TEST(Srconvert, ResamplerMixesTwoAndSpreadsOne) {
     for (const int64_t target : machineTargets()) {
         const OnTarget only(target);
-        Values in = noise(2 * 400);
+        const Values values = noise(2 * 400);
+        std::vector<double> in(values.begin(), values.end());
         in.resize(in.size() + snd::Resampler::padding);
         const int n = 300;
         Values one(n), two(2 * n), apart(2 * n), single(n);
@@ -161,10 +162,10 @@ TEST(Srconvert, ResamplerMixesTwoAndSpreadsOne) {
             ASSERT_TRUE(limited || std::abs(2 * one[i] - left - right) <= 2) << i;
         }
     }
-    const Values ones(40, 3);  // 16 taps of the same weight pair: (sum + 16383) >> 15 of 2 * 3 * table
+    const std::vector<double> ones(40, 3);  // 16 taps of the same weight pair: (sum + 16383) >> 15 of 2 * 3 * table
     const snd::Resampler reference(2, 1, 2, 4);
     int64_t sum = 0;
-    for (int k = 7; k < 16; ++k) sum += 6 * int64_t{reference.table()[static_cast<size_t>(k)]};
+    for (size_t k = 7; k < 16; ++k) sum += 6 * std::lround(reference.table()[k]);
     int32_t first = 0;
     snd::Resampler(2, 1, 2, 4).make(ones.data(), 20, &first, 1);
     EXPECT_EQ(first, (sum + 16383) >> 15);
