@@ -40,10 +40,9 @@ TEST_F(SoundFormat, WidthsChangeWithoutLoss) {
 TEST_F(SoundFormat, RatesKeepTheLength) {
     const struct {
         unsigned in, out, samples, wanted;
-    } cases[] = {{44100, 48000, 44100, 48000},
-                 {48000, 44100, 96000, 88200},
-                 {8000, 192000, 801, 19224},
-                 {192000, 8000, 48000, 2000}};
+    } cases[] = {{44100, 48000, 44100, 48000}, {48000, 44100, 96000, 88200}, {8000, 192000, 801, 19224},
+                 {192000, 8000, 48000, 2000},  {44100, 48000, 44101, 48001}, {48000, 44100, 48021, 44119},
+                 {22050, 11025, 7, 3}};
     for (const auto& c : cases) {
         makeWav("take.wav", c.samples, 3, 16, c.in);
         works({"transcode", "take.wav", "--samplerate", std::to_string(c.out), "-o", "out.wav", "-y"});

@@ -5,9 +5,13 @@
 #include <cmath>
 #include <numbers>
 
+#include "builtin/pipes/audiopipe.h"
 #include "builtin/sound/format/resampler.h"
 #include "builtin/sound/format/soxrrate.h"
+#include "core/engine/modules/qvregistry.h"
 #include "tests/builtin/sound/format/sound_blocks.h"
+#include "tests/support/engine.h"
+#include "tests/support/fake_streams.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/vector_targets.h"
 
@@ -162,7 +166,8 @@ TEST(Srconvert, ResamplerMixesTwoAndSpreadsOne) {
             ASSERT_TRUE(limited || std::abs(2 * one[i] - left - right) <= 2) << i;
         }
     }
-    const std::vector<double> ones(40, 3);  // 16 taps of the same weight pair: (sum + 16383) >> 15 of 2 * 3 * table
+    const std::vector<double> ones(
+        40, 3);  // 16 taps of the same weight pair: (sum + 16383) >> 15 of 2 * 3 * table
     const snd::Resampler reference(2, 1, 2, 4);
     int64_t sum = 0;
     for (size_t k = 7; k < 16; ++k) sum += 6 * std::lround(reference.table()[k]);
@@ -336,6 +341,38 @@ TEST(SrconvertHigh, IsInStepWithTheStandardQuality) {
 }
 
 #endif
+
+// Both qualities bring the same number of samples through a pipe, the last ones of the input among them.
+TEST(SrconvertHigh, CountsAreThoseOfTheStandardQuality) {
+    if (!snd::SoxrRate::isBuiltIn()) GTEST_SKIP() << "built without libsoxr";
+    const EngineScope engine;
+    for (const auto& [in, out] : {std::pair(44100, 48000), std::pair(96000, 44100), std::pair(8000, 192000)})
+        for (const int length : {in / 2 + 1, in / 2 + 333, 5})
+            for (const char* quality : {"standard", "high"}) {
+                SCOPED_TRACE(testing::Message() << in << " to " << out << ", " << length << ", " << quality);
+                FakeDecoder decoder(1, QvFramerate::f25p());
+                decoder.audio(length, in);
+                QvAf pipe;
+                auto* wide = static_cast<QvAudioFilter*>(qv_registry()->newCodec("aquant"));
+                auto* rate = static_cast<QvAudioFilter*>(qv_registry()->newCodec("srconvert"));
+                pipe.addFilter(wide, -1);
+                pipe.addFilter(rate, -1);
+                ASSERT_EQ(pipe.init(), 0);
+                wide->setParam("outBitsPerSample", 32);
+                rate->setParam("inSamplerate", in);
+                rate->setParam("outSamplerate", out);
+                rate->setParam("quality", quality);
+                ASSERT_EQ(pipe.open(), 0);
+                const int due = static_cast<int>(static_cast<long long>(length) * out / in), step = out / 25;
+                for (int done = 0; done < due; done += step) {
+                    const int want = std::min(step, due - done);
+                    ASSERT_EQ(pipe.process(&decoder, 0, want), 0) << done;
+                    pipe.erase(want);
+                }
+                EXPECT_EQ(pipe.process(&decoder, 0, out), QvStatus::endOfStream);
+                pipe.close();
+            }
+}
 
 TEST(SrconvertHigh, IsRefusedWithoutTheLibrary) {
     QvSamplerate2 filter;
