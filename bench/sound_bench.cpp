@@ -87,7 +87,7 @@ QvPcm buffer(int channels, int width, int bytes = bufferBytes) {
     uint32_t random = 1;
     for (int i = 0; i < samples * channels; ++i) {
         random = random * 1664525 + 1013904223;
-        const auto value = static_cast<int32_t>(width == 4 ? static_cast<int32_t>(random) >> 9 : random >> 8);
+        const int32_t value = static_cast<int32_t>(random) >> (width == 4 ? 9 : 8);
         std::memcpy(pcm.ptr(0) + static_cast<ptrdiff_t>(i) * width, &value, static_cast<size_t>(width));
     }
     pcm.setSamples(samples);

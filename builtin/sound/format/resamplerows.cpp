@@ -9,8 +9,6 @@
 HWY_BEFORE_NAMESPACE();
 namespace snd {
 namespace HWY_NAMESPACE {
-namespace hn = hwy::HWY_NAMESPACE;
-
 constexpr int tapCount = Resampler::taps;
 
 // Samples, taps, and the taps twice each.
@@ -60,6 +58,8 @@ HWY_INLINE void many(int32_t* out, In in, int channels, In taps) {
 }
 
 #else
+
+namespace hn = hwy::HWY_NAMESPACE;
 
 const hn::CappedTag<double, 4> d;
 const hn::FixedTag<double, 2> d2;

@@ -181,9 +181,11 @@ HWY_AFTER_NAMESPACE();
 #if HWY_ONCE
 namespace snd {
 
+// NOLINTBEGIN(bugprone-macro-parentheses)
 #define QV_SOUND_ROW(result, name, parameters, arguments) \
     HWY_EXPORT(name);                                     \
     result name parameters { return HWY_DYNAMIC_DISPATCH(name) arguments; }
+// NOLINTEND(bugprone-macro-parentheses)
 
 using Byte = unsigned char;
 QV_SOUND_ROW(void, widen8, (int32_t * to, const Byte* from, size_t count), (to, from, count))

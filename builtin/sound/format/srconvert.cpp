@@ -119,6 +119,11 @@ int QvSamplerate2::startResampler(int channels) {
     else if (rates) {
         resampler_ = std::make_unique<Resampler>(channels, channels, settings_.inRate, settings_.outRate);
         fifo_ = std::make_unique<snd::SampleFifo>(channels, Resampler::padding);
+        if (!fifo_->reserve(resampler_->need().viewFor(std::max(settings_.batch, 1)) +
+                            partValues / channels)) {
+            fifo_.reset();
+            resampler_.reset();
+        }
     }
     if (soxr_ || resampler_) return QvStatus::ok;
     return setError(QvStatus::failed, "[srconvert::writepcm]failed to allocate samplerate converter");

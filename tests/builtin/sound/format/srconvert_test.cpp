@@ -13,6 +13,7 @@
 #include "tests/support/engine.h"
 #include "tests/support/fake_streams.h"
 #include "tests/support/log_capture.h"
+#include "tests/support/platform_scope.h"
 #include "tests/support/vector_targets.h"
 
 #if __has_include(<soxr.h>)
@@ -270,6 +271,32 @@ TEST(Srconvert, RefusesWhatItCanNotConvert) {
     both.insert(both.end(), both.begin(), both.begin() + 100);
     EXPECT_TRUE(valuesOf(out) == modelled(both, 1, 44100, 48000, out.size() / 4))
         << "nothing is lost by a failure";
+}
+
+TEST(Srconvert, WithoutMemoryKeepsWhatItHad) {
+    const Values in = noise(30000);
+    QvPcm large = pcmOf(bytesOf(in), 1, 4),
+          small = pcmOf(bytesOf(Values(in.begin(), in.begin() + 500)), 1, 4);
+    NoMemory none, once(1);
+    {
+        const PlatformScope scope(none);
+        Opened filter{{"inSamplerate", 44100}, {"outSamplerate", 48000}};
+        EXPECT_EQ(filter.write(small), QvStatus::failed);
+        EXPECT_STREQ(filter.errorDesc(), "[srconvert::writepcm]failed to allocate samplerate converter");
+    }
+    const PlatformScope scope(once);
+    Opened filter{{"inSamplerate", 44100}, {"outSamplerate", 48000}, {"splsToGet", 100}};
+    ASSERT_EQ(filter.write(small), 0);
+    Bytes out;
+    take(filter, out);
+    filter.setParam("splsToGet", 100000);
+    EXPECT_EQ(filter.write(large), QvStatus::outOfMemory);
+    filter.setParam("splsToGet", 100);
+    EXPECT_EQ(filter.write(small), 0);
+    take(filter, out);
+    Values both(in.begin(), in.begin() + 500);
+    both.insert(both.end(), in.begin(), in.begin() + 500);
+    EXPECT_TRUE(valuesOf(out) == modelled(both, 1, 44100, 48000, out.size() / 4));
 }
 
 #if __has_include(<soxr.h>)
