@@ -67,6 +67,8 @@ int QvSamplerate2::open() {
 }
 
 int QvSamplerate2::close() {
+    if (opened())
+        qv_dbg()->debug("Closing samplerate converter, %lld samples in, %lld out", samplesIn_, samplesOut_);
     resampler_.reset();
     fifo_.reset();
     soxr_.reset();
@@ -113,7 +115,8 @@ int QvSamplerate2::startOutput(const QvPcm& pcm) {
 }
 
 int QvSamplerate2::startResampler(int channels) {
-    const bool rates = settings_.inRate > 0 && settings_.outRate > 0;
+    const auto isRate = [](int rate) { return rate > 0 && rate <= Resampler::maxRate; };
+    const bool rates = isRate(settings_.inRate) && isRate(settings_.outRate);
     if (rates && settings_.quality == Settings::high)
         soxr_ = snd::SoxrRate::create(channels, settings_.inRate, settings_.outRate);
     else if (rates) {
@@ -132,7 +135,7 @@ int QvSamplerate2::startResampler(int channels) {
 int QvSamplerate2::write(QvPcm& pcm) {
     requireOpened();
     if (pcm.samples() < 1) return QvStatus::ok;
-    const bool equal = settings_.inRate == settings_.outRate;
+    const bool equal = !resampler_ && !soxr_ && settings_.inRate == settings_.outRate;
     QV_ASSERT_MSG(equal || pcm.bytesPerSample() == wideBytes, "Only 32 bit samples supported");
     if (!equal && !resampler_ && !soxr_)
         if (const int result = startResampler(pcm.channels())) return result;
@@ -172,10 +175,11 @@ long long QvSamplerate2::makeBatches(int32_t* room) {
 
 int QvSamplerate2::writeStandard(const QvPcm& pcm) {
     const int filled = output_.samples(), channels = pcm.channels();
-    const long long batch = settings_.batch, need = resampler_->need().viewFor(batch);
+    const snd::RateNeed rates = resampler_->need();  // those of the settings may have changed since
+    const long long batch = settings_.batch, need = rates.viewFor(batch);
     const long long part = std::min(pcm.samples(), std::max(partValues / channels, 1));
     const long long all = fifo_->samples() + pcm.samples();
-    const long long most = all * settings_.outRate / settings_.inRate + Resampler::taps + 4 * batch;
+    const long long most = all * rates.outRate / rates.inRate + Resampler::taps + 4 * batch;
     unsigned char* room = nullptr;
     if (!fifo_->reserve(std::min(all, std::max(fifo_->samples(), need) + part))) return noRoom(all);
     if (most > INT_MAX) return noRoom(most);

@@ -8,6 +8,8 @@
 //                                       estimate
 //   "quality"     string   "standard"   16 taps, integers; "high": libsoxr
 //
+// The rates and the quality hold from the first write on until close.
+//
 // The output begins at the time of the first input sample with either quality, and is the same whatever the
 // sizes of the buffers written are. Samples are 32 bits wide, in the range of 24 bits.
 #pragma once

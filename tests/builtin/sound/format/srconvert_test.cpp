@@ -233,6 +233,26 @@ TEST(Srconvert, CloseForgetsTheStream) {
     EXPECT_TRUE(throughFilter(filter, in, 1) == first);
 }
 
+TEST(Srconvert, RatesHoldUntilClose) {
+    const Values in = noise(4000);
+    for (const auto& [inRate, outRate] : {std::pair(0, 0), {192000, 8000}, {1, 1 << 30}}) {
+        Opened filter{{"inSamplerate", 8000}, {"outSamplerate", 96000}, {"splsToGet", 100}};
+        Values out = throughFilter(filter, in, 1);
+        filter.setParam("inSamplerate", inRate);
+        filter.setParam("outSamplerate", outRate);
+        for (const int32_t value : throughFilter(filter, in, 1)) out.push_back(value);
+        Values both = in;
+        both.insert(both.end(), in.begin(), in.end());
+        EXPECT_TRUE(out == modelled(both, 1, 8000, 96000, out.size())) << inRate;
+    }
+    QvSamplerate2 late;
+    ASSERT_EQ(late.init(), 0);
+    ASSERT_EQ(late.open(), 0);
+    late.setParam("inSamplerate", 1 << 30);
+    QvPcm pcm = pcmOf(bytesOf(in), 1, 4);
+    EXPECT_EQ(late.write(pcm), QvStatus::failed);
+}
+
 TEST(Srconvert, RefusesWhatItCanNotConvert) {
     QvSamplerate2 fresh;
     EXPECT_THROW(fresh.setParam("inSamplerate", 1), QvAssertFailure);
