@@ -38,3 +38,7 @@ QvCodec* newTimecode();
 QvCodec* newSubtitle();
 QvCodec* newFrconvert();
 QvCodec* newBobber();
+QvCodec* newSrconvert();
+QvCodec* newChconvert();
+QvCodec* newAquant();
+QvCodec* newAvol();

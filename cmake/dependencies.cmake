@@ -30,3 +30,8 @@ qv_pkg(UNIBREAK libunibreak libunibreak-dev)
 qv_pkg(UCHARDET uchardet libuchardet-dev)
 qv_pkg(CRYPTOPP libcrypto++ libcrypto++-dev)
 qv_pkg(HWY libhwy libhwy-dev)
+# Without it the rate converter has no quality "high".
+pkg_check_modules(SOXR QUIET IMPORTED_TARGET soxr)
+if(NOT SOXR_FOUND)
+  message(STATUS "libsoxr was not found: no sample rates of high quality. On Debian: apt-get install libsoxr-dev")
+endif()

@@ -13,6 +13,11 @@ target_link_libraries(qv_objects PUBLIC
   PkgConfig::DEFLATE PkgConfig::FONTCONFIG PkgConfig::HARFBUZZ PkgConfig::FRIBIDI PkgConfig::UNIBREAK PkgConfig::UCHARDET
   PkgConfig::CRYPTOPP PkgConfig::HWY
   ${CMAKE_DL_LIBS})
+if(SOXR_FOUND)
+  target_link_libraries(qv_objects PUBLIC PkgConfig::SOXR)
+  set_source_files_properties(${CMAKE_SOURCE_DIR}/builtin/sound/format/soxrrate.cpp PROPERTIES
+                              COMPILE_DEFINITIONS QV_HAVE_SOXR)
+endif()
 
 qv_precompile(qv_objects <algorithm> <functional> <memory> <string> <vector>
               ${CMAKE_SOURCE_DIR}/core/value/anycontainer.h)

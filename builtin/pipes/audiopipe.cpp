@@ -55,6 +55,7 @@ int QvAf::open() {
     }
     setState(stateOpen);
     samplesIn_ = 0;
+    samplesRead_ = 0;
     samplesOut_ = 0;
     inFormat_ = {};
     return QvStatus::ok;
@@ -153,6 +154,7 @@ int QvAf::readInput(QvDecodePipe& decoder, int stream, int missing, bool& eof) {
     if (result == QvStatus::endOfStream || count < 1) eof = true;
     if (count < 1) return QvStatus::ok;
     samplesIn_ += count;
+    samplesRead_ += count;
     noteFormat(*pcm);
     return give(*pcm, missing);
 }
@@ -203,7 +205,14 @@ int QvAf::process(QvDecodePipe* decoder, int stream, int want) {
         }
         if (result != QvStatus::ok) return result;
     }
-    return eof ? QvStatus::endOfStream : QvStatus::ok;
+    return eof && isPadded(want) ? QvStatus::endOfStream : QvStatus::ok;
+}
+
+// Filters that look ahead meet the end of the input before all of it has come out. The stream ends where
+// silence comes out that was written to bring out the rest.
+bool QvAf::isPadded(int taken) const {
+    const long long out = samplesOut_ - output_.samples() + taken;
+    return static_cast<double>(out) > std::ceil(static_cast<double>(samplesRead_) / readRatio_);
 }
 
 bool QvAf::validPosition(int position) const { return position >= 0 && position < nrFilters(); }

@@ -52,6 +52,8 @@ class QvAf : public QvAProcessPipe {
     int inputFor(int missing) const;
     int readInput(QvDecodePipe& decoder, int stream, int missing, bool& eof);
     int writeSilence(int missing);
+    // Whether the first `taken` samples of the output go beyond the end of the input.
+    bool isPadded(int taken) const;
     void noteFormat(const QvPcm& pcm);
     int give(QvPcm& pcm, int missing);
 
@@ -62,5 +64,6 @@ class QvAf : public QvAProcessPipe {
     QvPcmFormat inFormat_;  // as last seen; zeros before
     QvPcm silence_;         // of the input's format, for the end of the input
     long long samplesIn_ = 0;
+    long long samplesRead_ = 0;  // of the input, without silence after it
     long long samplesOut_ = 0;
 };

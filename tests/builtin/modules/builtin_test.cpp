@@ -36,10 +36,10 @@ TEST_F(Builtin, ARestoredValueThatIsRefusedIsNamed) {
         const char *module, *part, *row;
         Any value;
     } cases[] = {
-        {"scaler", "state", "outWidth", "wide"},       {"frconvert", "state", "outFramerate", "fast"},
-        {"brightness", "state", "gamma", 11.0},        {"rawmux", nullptr, "splitVideo", "often"},
-        {"rawavimux", nullptr, "segments", 0},         {"rawvenc", "settingsDict", "width", "wide"},
-        {"rawaenc", "settingsDict", "channels", "all"}};
+        {"scaler", "state", "outWidth", "wide"},        {"frconvert", "state", "outFramerate", "fast"},
+        {"brightness", "state", "gamma", 11.0},         {"rawmux", nullptr, "splitVideo", "often"},
+        {"rawavimux", nullptr, "segments", 0},          {"rawvenc", "settingsDict", "width", "wide"},
+        {"rawaenc", "settingsDict", "channels", "all"}, {"avol", nullptr, "volume", "loud"}};
     for (const auto& c : cases) {
         const std::unique_ptr<QvCodec> codec(registry.newCodec(c.module));
         AnyDict stored;

@@ -79,6 +79,23 @@ TEST(AudioPipe, EndsWithSilenceThatFlushesTheFilters) {
     }
 }
 
+// A filter that looks ahead reaches the end of the input early. All of the input comes out before the end
+// does.
+TEST(AudioPipe, TheEndComesAfterTheLastSampleOfTheInput) {
+    for (const int holdBack : {0, 30, 100}) {
+        Source decoder(1000);
+        Pipe pipe({"a", "b"});
+        pipe.at(0).holdBack = holdBack;
+        ASSERT_EQ(pipe.open(), 0);
+        for (const int want : {950, 49, 1}) {
+            EXPECT_EQ(pipe.process(&decoder, 0, want), 0) << want << " with " << holdBack;
+            EXPECT_NE(pipe.take(want).back(), 0);
+        }
+        EXPECT_EQ(pipe.process(&decoder, 0, 5), QvStatus::endOfStream);
+        EXPECT_EQ(pipe.take(5), (std::vector<int>(5, 0)));
+    }
+}
+
 TEST(AudioPipe, TheReadsFollowTheConvertersRatio) {
     Source decoder(100000, 44100);
     Pipe pipe({"a", "srconvert", "b"});

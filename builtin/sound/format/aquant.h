@@ -1,0 +1,34 @@
+// Converts the width of samples, to and from the 32-bit values between the stages of a chain.
+//
+//   "outBitsPerSample"   int      24       8, 16, 20, 24 or 32; 20 bits take 3 bytes like 24
+//   "dither"             string   "none"   "none": lower bits are cut off; "triangular": when the output has
+//   8
+//                                          or 16 bits, noise of triangular distribution, two steps wide, is
+//                                          added before rounding. It is the same in every run
+//
+// Sound of the same width is copied. Values out of range take the nearest bound, with one warning per open.
+#pragma once
+
+#include "builtin/sound/format/formatfilter.h"
+
+struct AquantSettings {
+    enum Dither { none, triangular };
+
+    int outBits = 24;
+    Dither dither = none;
+};
+
+class QvAquant : public FormatFilterOf<AquantSettings> {
+  public:
+    QvAquant();
+
+    int init() override;
+    int open() override;
+    int write(QvPcm& pcm) override;
+
+  private:
+    bool narrow(unsigned char* to, const int32_t* from, size_t count, int bytes);
+
+    bool warnOnClip_ = false, clipReported_ = false;
+    uint32_t ditherPlace_ = 0;  // values that were dithered so far, modulo 2^32
+};

@@ -1,0 +1,67 @@
+// Sound whose format changes from file to file: widths, rates, levels.
+#include "tests/system/tool.h"
+
+namespace {
+
+class SoundFormat : public Tool {
+  protected:
+    // The values of a WAV file; 8 bits about zero.
+    std::vector<int> values(const std::string& file, int bytes) const {
+        const std::string data = wavPart(contents(file), "data");
+        std::vector<int> list;
+        for (size_t at = 0; at < data.size(); at += static_cast<size_t>(bytes)) {
+            const auto raw = static_cast<uint32_t>(leNumber(data, at, bytes));
+            const int shift = 32 - 8 * bytes;
+            list.push_back(bytes == 1 ? static_cast<int>(raw) - 128
+                                      : static_cast<int>(raw << shift) >> shift);
+        }
+        return list;
+    }
+    template <class Formula>
+    void expectEach(int inBytes, int outBytes, Formula formula) const {
+        std::vector<int> wanted;
+        for (const int value : values("take.wav", inBytes)) wanted.push_back(formula(value));
+        EXPECT_TRUE(values("out.wav", outBytes) == wanted);
+    }
+};
+
+TEST_F(SoundFormat, WidthsChangeWithoutLoss) {
+    for (const int in : {1, 2, 3})
+        for (const int out : {1, 2, 3}) {
+            SCOPED_TRACE(std::to_string(in) + " to " + std::to_string(out) + " bytes");
+            makeWav("take.wav", 12345, 2, 8 * static_cast<unsigned>(in), 48000);
+            works({"transcode", "take.wav", "--bits", std::to_string(8 * out), "-o", "out.wav", "-y"});
+            expectEach(in, out, [=](int value) {
+                return in < out ? value * (1 << 8 * (out - in)) : value >> 8 * (in - out);
+            });
+        }
+}
+
+TEST_F(SoundFormat, RatesKeepTheLength) {
+    const struct {
+        unsigned in, out, samples, wanted;
+    } cases[] = {{44100, 48000, 44100, 48000}, {48000, 44100, 96000, 88200}, {8000, 192000, 801, 19224},
+                 {192000, 8000, 48000, 2000},  {44100, 48000, 44101, 48001}, {48000, 44100, 48021, 44119},
+                 {22050, 11025, 7, 3}};
+    for (const auto& c : cases) {
+        makeWav("take.wav", c.samples, 3, 16, c.in);
+        works({"transcode", "take.wav", "--samplerate", std::to_string(c.out), "-o", "out.wav", "-y"});
+        EXPECT_EQ(values("out.wav", 2).size(), 3 * c.wanted) << c.in << " to " << c.out;
+    }
+}
+
+TEST_F(SoundFormat, LevelsFollowTheFilter) {
+    makeWav("take.wav", 5000, 2, 16, 48000);
+    works({"transcode", "take.wav", "--filter", "avol:volume=-6.1", "-o", "out.wav"});
+    expectEach(2, 2, [](int value) { return (value * 256 * 15 >> 5) >> 8; });
+    const Outcome o =
+        works({"transcode", "take.wav", "--filter", "avol:volume=20,precision=16", "-o", "out.wav", "-y"});
+    EXPECT_THAT(o.err, testing::HasSubstr("clipping detected"));
+    expectEach(2, 2, [](int value) { return std::clamp(value * 10, -32768, 32767); });
+    fails(2, {"transcode", "take.wav", "--filter", "avol:precision=8", "-o", "no.wav"},
+          {"'precision' takes 5 (gains up to 6 dB"});
+    fails(2, {"transcode", "take.wav", "--filter", "aquant:dither=some", "-o", "no.wav"},
+          {"'dither' takes none or triangular"});
+}
+
+}  // namespace
