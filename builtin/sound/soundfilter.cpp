@@ -30,12 +30,16 @@ int SoundFilter::close() {
 
 int SoundFilter::makeRoom(const QvPcmFormat& format, int count, unsigned char*& room) {
     room = nullptr;
+    const int bytes = (format.bitsPerSample + bitsPerByte - 1) / bitsPerByte;
     if (!output_.inited()) {
-        const int bytes = (format.bitsPerSample + bitsPerByte - 1) / bitsPerByte;
         if (output_.init(count, format.channels, bytes, format.samplerate) != QvStatus::ok)
             return setError(QvStatus::outOfMemory, "[%s]failed to allocate space for %d samples", tag_,
                             count);
     }
+    if (output_.channels() != format.channels || output_.bytesPerSample() != bytes)
+        return setError(
+            QvStatus::failed, "the format of the sound changed from %d channels of %d bits to %d of %d",
+            output_.channels(), output_.bytesPerSample() * bitsPerByte, format.channels, bytes * bitsPerByte);
     const int filled = output_.samples();
     const int missing = count - (output_.size() - filled);
     if (missing > 0 && output_.grow(missing) < 0)

@@ -9,6 +9,7 @@
 
 #include "core/engine/modules/params.h"
 #include "core/filter/qvfilter.h"
+#include "core/measure/qvgeometry.h"
 #include "core/media/qvpcm.h"
 
 // Lifecycle and hand-over. A filter goes created (1), init (2), open (3), close (2).
@@ -31,8 +32,8 @@ class SoundFilter : public QvAudioFilter {
     void requireInited() const;
     void requireOpened() const;
     // Adds `count` samples, whose contents are the caller's to fill, after those that wait in the output. The
-    // first call after open gives the output its format. The place of the first one goes to `room`. 0, or -3
-    // with a text; the output keeps what it had then.
+    // first call after open gives the output its format, which must stay. The place of the first one goes to
+    // `room`. 0, -3 without memory or -1 for another format, with a text; the output keeps what it had then.
     int makeRoom(const QvPcmFormat& format, int count, unsigned char*& room);
 
     QvPcm output_;
