@@ -38,3 +38,8 @@ QvCodec* newTimecode();
 QvCodec* newSubtitle();
 QvCodec* newFrconvert();
 QvCodec* newBobber();
+QvCodec* newAdelay();
+QvCodec* newDynamics();
+QvCodec* newAudiolevel();
+QvCodec* newPanning();
+QvCodec* newNormalizer();
