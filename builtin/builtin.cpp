@@ -51,9 +51,9 @@ constexpr QvBuiltinRow registered[] = {
     {"animatedlogo", videoFilter,  "Animated logo",                  "Animated logo",              newAnimatedlogo},
     {"nullmux",      muxer,        "Dummy multiplexer",              "Null",                       newNullmux,
      {.internal = true}},
-    {"normalizer",   audioFilter,  "Normalize Sound Level",          "Normalizer",                 nullptr},
-    {"dynamics",     audioFilter,  "Dynamics Processing",            "Dynamics Processing",        nullptr},
-    {"adelay",       audioFilter,  "Audio delay",                    "Audio delay",                nullptr},
+    {"normalizer",   audioFilter,  "Normalize Sound Level",          "Normalizer",                 newNormalizer},
+    {"dynamics",     audioFilter,  "Dynamics Processing",            "Dynamics Processing",        newDynamics},
+    {"adelay",       audioFilter,  "Audio delay",                    "Audio delay",                newAdelay},
     {"p2dec",        decoder,      "P2 decoder wrapper",             "P2 decoder wrapper",         nullptr,
      {.exts = "xml", .priority = 9}},
     {"userdata",     videoFilter,  "User data callback filter",      "User data callback filter",  newUserdata},
@@ -72,8 +72,8 @@ constexpr QvBuiltinRow registered[] = {
     {"sccdec",       decoder,      "Scenarist SCC CC reader",        "SCC reader",                 newSccdec,
      {.exts = "scc sc2", .priority = 10, .internal = true}},
     {"videofade",    videoFilter,  "Video fade filter",              "Video fade filter",          newVideofade},
-    {"audiolevel",   audioFilter,  "Audio level filter",             "Audio level filter",         nullptr},
-    {"panning",      audioFilter,  "Audio panning filter",           "Audio panning filter",       nullptr},
+    {"audiolevel",   audioFilter,  "Audio level filter",             "Audio level filter",         newAudiolevel},
+    {"panning",      videoFilter,  "Audio panning filter",           "Audio panning filter",       newPanning},
 };
 static_assert(std::size(registered) == 44);
 

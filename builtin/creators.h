@@ -42,3 +42,8 @@ QvCodec* newSrconvert();
 QvCodec* newChconvert();
 QvCodec* newAquant();
 QvCodec* newAvol();
+QvCodec* newAdelay();
+QvCodec* newDynamics();
+QvCodec* newAudiolevel();
+QvCodec* newPanning();
+QvCodec* newNormalizer();

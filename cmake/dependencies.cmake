@@ -28,6 +28,7 @@ qv_pkg(HARFBUZZ harfbuzz libharfbuzz-dev)
 qv_pkg(FRIBIDI fribidi libfribidi-dev)
 qv_pkg(UNIBREAK libunibreak libunibreak-dev)
 qv_pkg(UCHARDET uchardet libuchardet-dev)
+qv_pkg(EBUR128 libebur128 libebur128-dev)
 qv_pkg(CRYPTOPP libcrypto++ libcrypto++-dev)
 qv_pkg(HWY libhwy libhwy-dev)
 # Without it the rate converter has no quality "high".

@@ -11,7 +11,7 @@ target_include_directories(qv_objects PUBLIC ${CMAKE_SOURCE_DIR})
 target_link_libraries(qv_objects PUBLIC
   Threads::Threads ZLIB::ZLIB PNG::PNG EXPAT::EXPAT Freetype::Freetype
   PkgConfig::DEFLATE PkgConfig::FONTCONFIG PkgConfig::HARFBUZZ PkgConfig::FRIBIDI PkgConfig::UNIBREAK PkgConfig::UCHARDET
-  PkgConfig::CRYPTOPP PkgConfig::HWY
+  PkgConfig::CRYPTOPP PkgConfig::HWY PkgConfig::EBUR128
   ${CMAKE_DL_LIBS})
 if(SOXR_FOUND)
   target_link_libraries(qv_objects PUBLIC PkgConfig::SOXR)

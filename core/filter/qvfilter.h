@@ -53,6 +53,15 @@ class QV_API QvVideoFilter : public QvCodec {
     AnyDict common_;
 };
 
+// What an audio filter answers for "_needsReport": whether it is to get a Dict "_streamReport" before open,
+// and which. With `loudness` the Dict also has the levels of the sound that reaches the filter, see
+// QvProcessUtil::applyStreamReport.
+namespace QvReportNeed {
+constexpr int none = 0;
+constexpr int peak = 1;
+constexpr int loudness = 2;
+}  // namespace QvReportNeed
+
 // Interface number 13.
 class QV_API QvAudioFilter : public QvCodec {
   public:

@@ -2,7 +2,7 @@
 
 #include <algorithm>
 #include <cmath>
-#include <cstring>
+#include <string>
 #include <vector>
 
 #include "core/arch/qvassert.h"
@@ -10,6 +10,7 @@
 #include "core/encode/qvencodepipe.h"
 #include "core/engine/log/qvlog.h"
 #include "core/engine/modules/optionalparam_p.h"
+#include "core/filter/chainloudness_p.h"
 #include "core/filter/qvprocesspipe.h"
 #include "core/job/jobdescription.h"
 #include "core/measure/qvgeometry.h"
@@ -27,11 +28,31 @@ const char* cropModeName(int mode) {
     return "scale";
 }
 
-std::vector<QvAudioFilter*> filtersThatNeedReport(const QvAProcessPipe& pipe) {
-    std::vector<QvAudioFilter*> filters;
-    for (int i = 0; i < pipe.nrFilters(); ++i)
-        if (pipe.filter(i)->getParam("_needsReport").isTrue()) filters.push_back(pipe.filter(i));
-    return filters;
+int reportNeed(const QvAudioFilter& filter) {
+    const Any need = filter.getParam("_needsReport");
+    if (!need.isTrue()) return QvReportNeed::none;
+    return need == Any(QvReportNeed::loudness) ? QvReportNeed::loudness : QvReportNeed::peak;
+}
+
+// A report is of samples of up to three bytes; those of a mixed input have four.
+const QvAudioStreamReport* levelReport(QvDecodePipe& decoder, int stream) {
+    constexpr int widest = 3;
+    const bool measurable = stream >= 0 && stream < decoder.nrAudioStreams() &&
+                            decoder.getAudioParam(stream, "bytesPerSample").asInt32(0) <= widest;
+    const auto* report = measurable ? decoder.getAudioStreamReport(stream) : nullptr;
+    if (!report) qv_log()->error("Can not get audio stream report");
+    return report;
+}
+
+void giveReport(QvAudioFilter& filter, const AnyDict& levels) {
+    try {
+        filter.setParam("_streamReport", levels);
+    } catch (const QvParamException&) {
+        qv_log()->error(
+            "Filter %s claimed that it needs stream report by '_needsReport' getParam() but does not "
+            "accept '_streamReport' setParam()",
+            filter.name());
+    }
 }
 
 }  // namespace
@@ -56,25 +77,25 @@ void QvProcessUtil::adjustVideoEncoder(const VideoJobDescription& job, QvVProces
 
 void QvProcessUtil::applyStreamReport(QvAProcessPipe* pipe, QvDecodePipe* decoder, int decoderStream,
                                       long long from, long long to) {
-    const auto filters = filtersThatNeedReport(*pipe);
-    if (filters.empty()) return;
+    std::vector<int> needs;
+    for (int i = 0; i < pipe->nrFilters(); ++i) needs.push_back(reportNeed(*pipe->filter(i)));
+    const int most = needs.empty() ? QvReportNeed::none : *std::max_element(needs.begin(), needs.end());
+    if (most == QvReportNeed::none) return;
     qv_log()->info("Obtaining input stream report, needed by some of the audio filters");
-    const auto* report = decoder->getAudioStreamReport(decoderStream);
-    if (!report) {
-        qv_log()->error("Can not get audio stream report");
-        return;
-    }
-    AnyDict levels;
-    levels.set("peakLeveldB", report->peakdB(from, to));
-    for (auto* filter : filters) {
-        try {
-            filter->setParam("_streamReport", levels);
-        } catch (const QvParamException&) {
-            qv_log()->error(
-                "Filter %s claimed that it needs stream report by '_needsReport' getParam() but does not "
-                "accept '_streamReport' setParam()",
-                filter->name());
-        }
+    const auto* report = levelReport(*decoder, decoderStream);
+    if (!report && most < QvReportNeed::loudness) return;
+    const qvchain::SoundRange range{decoder, decoderStream, from, to};
+    std::vector<AnyDict> reports(needs.size());
+    for (std::size_t i = 0; i < needs.size(); ++i) {
+        AnyDict& levels = reports[i];
+        if (needs[i] != QvReportNeed::none && report) levels.set("peakLeveldB", report->peakdB(from, to));
+        // The filters before this one work with their reports already.
+        std::string why;
+        if (needs[i] == QvReportNeed::loudness &&
+            !qvchain::measureBefore(*pipe, static_cast<int>(i), reports, {&range, 1}, levels, why))
+            qv_log()->error("Can not measure the loudness for filter %s: %s",
+                            pipe->filter(static_cast<int>(i))->name(), why.c_str());
+        if (!levels.empty()) giveReport(*pipe->filter(static_cast<int>(i)), levels);
     }
 }
 

@@ -48,8 +48,17 @@ class QV_API QvProcessUtil {
     // A pipe that is not open yet, owned by the caller; null when the job needs no processing. A delay filter
     // that asks for no or a negative delay becomes the time at the input's start that is to be skipped.
     static QvAProcessPipe* createAudioPipe(const AudioJobDescription& job, MediaTime& delayOut);
-    // Gives the peak level of the stream's samples from..to to the filters that need it. Reads the whole
-    // stream if any does.
+    // Sets a report on the stream's samples from..to as "_streamReport" on each filter that needs one
+    // ("_needsReport", QvReportNeed). Reads the stream, and leaves it at its beginning, if any does. All
+    // levels are Floats:
+    //   "peakLeveldB"         dB     peak of the decoder's samples; absent for samples of four bytes
+    // and for QvReportNeed::loudness, of the sound that a second chain of the same filters gives to this one:
+    //   "integratedLoudness"  LUFS   minus infinity if nothing is loud enough
+    //   "loudnessRange"       LU
+    //   "truePeakdB"          dBTP   minus infinity for silence, as the two below
+    //   "samplePeakdB"        dBFS
+    //   "rmsdB"               dBFS
+    // The pipe is not open yet. What can't be measured is logged and left out.
     static void applyStreamReport(QvAProcessPipe* pipe, QvDecodePipe* decoder, int decoderStream,
                                   long long from, long long to);
 

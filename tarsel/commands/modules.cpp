@@ -1,6 +1,7 @@
 // The modules of this installation and their parameters.
 #include "tarsel/commands/commands.h"
 #include "tarsel/host/console.h"
+#include "tarsel/source/source.h"
 #include "tarsel/words/commandline.h"
 #include "tarsel/words/json.h"
 #include "tarsel/words/messages.h"
@@ -58,7 +59,7 @@ Json describe(QvModule& module) {
     const std::unique_ptr<QvCodec> codec(qv_registry()->newCodec(module.name()));
     Json row;
     row["name"] = module.name();
-    row["kind"] = kindName(module.getAttr("type").toInt32());
+    row["kind"] = kindName(moduleKind(module));
     row["description"] = module.desc();
     row["plugin"] = module.plugin() ? module.plugin()->name() : "";
     row["usable"] = codec != nullptr;

@@ -89,7 +89,7 @@ int matrixNumber(std::string_view text, const std::string& all) {
 int filterType(const std::string& spec) {
     const std::string name = filterName(spec);
     const QvModule* module = qv_registry()->module(name.c_str());
-    const int kind = module ? module->getAttr("type").toInt32() : 0;
+    const int kind = module ? moduleKind(*module) : 0;
     if (kind == kVideoFilter) return kVideo;
     if (kind == kAudioFilter) return kAudio;
     std::vector<std::string> known = moduleNames(kVideoFilter);

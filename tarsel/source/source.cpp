@@ -69,9 +69,17 @@ std::vector<std::string> moduleNames(int kind) {
     return names;
 }
 
+int moduleKind(const QvModule& module) {
+    constexpr int kVideoFilter = 12, kAudioFilter = 13;
+    const int kind = module.getAttr("type").toInt32();
+    if (kind != kVideoFilter) return kind;
+    const std::unique_ptr<QvCodec> codec(qv_registry()->newCodec(module.name()));
+    return codec && codec->getInterface(kAudioFilter) ? kAudioFilter : kind;
+}
+
 std::unique_ptr<QvCodec> makeAnyCodec(const std::string& module, int kind) {
     const QvModule* found = qv_registry()->module(module.c_str());
-    if (!found || found->getAttr("type").toInt32() != kind)
+    if (!found || moduleKind(*found) != kind)
         throw failure(Msg::moduleUnknown, {module, suggestion(module, moduleNames(kind))});
     std::unique_ptr<QvCodec> codec(qv_registry()->newCodec(module.c_str()));
     if (!codec) throw failure(Msg::moduleUnusable, {module});

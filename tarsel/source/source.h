@@ -61,6 +61,9 @@ std::vector<std::string> engineWarnings();
 // The same on the standard error, each line once. Returns how many.
 int printWarnings();
 
+// What a module is: one that is registered as a video filter and works on sound is an audio filter.
+int moduleKind(const QvModule& module);
+
 // The names of all modules of a kind.
 std::vector<std::string> moduleNames(int kind);
 

@@ -87,7 +87,9 @@ TEST_F(Builtin, CodecsFitTheirRows) {
         EXPECT_TRUE(known.count(type));
         const std::unique_ptr<QvCodec> codec(module->create());
         if (!codec) continue;
-        EXPECT_NE(codec->getInterface(type == 14 ? 12 : type == 16 ? 13 : type), nullptr);
+        // Registered as a video filter, and yet one of sound.
+        const bool isSound = type == 16 || std::string(module->name()) == "panning";
+        EXPECT_NE(codec->getInterface(type == 14 ? 12 : isSound ? 13 : type), nullptr);
         EXPECT_EQ(codec->getInterface(1), nullptr);
         EXPECT_STREQ(codec->name(), module->name());
         EXPECT_TRUE(module->codecList().contains(codec.get()));

@@ -1,0 +1,110 @@
+// The normalizer in a pipe, from its report to what comes out.
+#include "core/engine/modules/qvregistry.h"
+#include "core/filter/qvprocesspipe.h"
+#include "core/filter/qvprocessutil.h"
+#include "core/media/qvloudness.h"
+#include "tests/builtin/sound/effects/effect_sounds.h"
+#include "tests/support/engine.h"
+#include "tests/support/fake_streams.h"
+
+namespace {
+
+// One stream of 32-bit samples, as a mixed input has them.
+class WideDecoder : public FakeDecoder {
+  public:
+    WideDecoder(const Values& values, int channels) : FakeDecoder(1, QvFramerate::f25p()) {
+        const int samples = static_cast<int>(values.size()) / channels;
+        audio(samples, 48000, channels);
+        track(0).params.set("bytesPerSample", 4);
+        track(0).params.set("bitsPerSample", 32);
+        sound_ = soundOf(values, channels);
+        EXPECT_EQ(QvDecodePipe::open(), 0);
+    }
+    int open() override { return 0; }
+    int readSamples(int count, int) override {
+        auto& [params, total, position, pcm] = track(0);
+        const int n = static_cast<int>(std::min<long long>(count, total - position));
+        pcm.init(std::max(n, 0), sound_.channels(), 4, sound_.samplerate());
+        if (n < 1) return QvStatus::endOfStream;
+        pcm.write(n, sound_.ptr(static_cast<int>(position)));
+        position += n;
+        return n;
+    }
+
+  private:
+    QvPcm sound_;
+};
+
+struct Step {
+    const char* filter;
+    AnyDict params;
+};
+
+// The samples from..to through the filters, as a link does it; `meter` gets what comes out.
+void play(WideDecoder& decoder, const std::vector<Step>& steps, int from, int to, QvLoudness& meter) {
+    const std::unique_ptr<QvAProcessPipe> pipe(QvAProcessPipe::create());
+    for (const auto& [name, params] : steps) {
+        auto* filter = static_cast<QvAudioFilter*>(qv_registry()->newCodec(name));
+        ASSERT_TRUE(filter) << name;
+        EXPECT_EQ(filter->setParamDict(params), 0) << filter->errorDesc();
+        pipe->addFilter(filter, -1);
+    }
+    QvProcessUtil::applyStreamReport(pipe.get(), &decoder, 0, from, to);
+    ASSERT_EQ(pipe->open(), 0);
+    decoder.seekToSample(from, 0);
+    for (int left = to - from; left > 0;) {
+        const int count = std::min(left, 1920);
+        ASSERT_EQ(pipe->process(&decoder, 0, count), 0);
+        ASSERT_EQ(pipe->pcm()->samples(), count);
+        if (left == to - from) meter.init(pipe->pcm()->channels(), 48000);
+        ASSERT_EQ(meter.add(*pipe->pcm()), 0);
+        pipe->erase(count);
+        left -= count;
+    }
+}
+
+TEST(NormalizedChain, WhatComesOutHasTheLevel) {
+    const EngineScope engine;
+    Values values = sine(3 * 48000, 2, 0.5, 997);
+    const Values quiet = sine(2 * 48000, 2, 0.05, 997);
+    values.insert(values.end(), quiet.begin(), quiet.end());
+    WideDecoder decoder(values, 2);
+    AnyVector fall(Any(AnyDict("time", 0.0, "volume", 100)), Any(AnyDict("time", 2.0, "volume", 5)));
+    const AnyDict curve("volume_list_0", Any(fall));
+    const AnyDict squeeze("compressorActive", 1, "compressorLevel", -20.0, "limiterActive", 1);
+    const std::vector<std::vector<Step>> chains = {
+        {}, {{"audiolevel", curve}}, {{"dynamics", squeeze}, {"adelay", AnyDict("delay", 300)}}};
+    for (auto chain : chains) {
+        for (const auto& [mode, target, level] : {std::tuple{"peak", -12.0, &QvLoudness::samplePeak},
+                                                  {"rms", -27.5, &QvLoudness::rms},
+                                                  {"loudness", -30.0, &QvLoudness::integrated}}) {
+            for (const auto& [from, to] : {std::pair{0, 5 * 48000}, {2 * 48000, 4 * 48000}}) {
+                const LogCapture log;
+                auto steps = chain;
+                steps.push_back({"normalizer", AnyDict("mode", mode, "target", target)});
+                QvLoudness meter;
+                play(decoder, steps, from, to, meter);
+                EXPECT_NEAR((meter.*level)(), target, 0.01)
+                    << mode << " after " << chain.size() << " filters";
+                EXPECT_EQ(log.count("", QvLogMask::warning), 0);
+            }
+        }
+    }
+}
+
+TEST(NormalizedChain, TheTruePeakIsTheLimitAndSilenceStays) {
+    const EngineScope engine;
+    const LogCapture log;
+    WideDecoder decoder(sine(3 * 48000, 6, 0.02, 11997), 6);
+    QvLoudness meter;
+    play(decoder, {{"normalizer", AnyDict("mode", "loudness", "target", 12.0, "truePeak", -2.0)}}, 0,
+         3 * 48000, meter);
+    EXPECT_NEAR(meter.truePeak(), -2, 0.05);
+    EXPECT_TRUE(log.contains("its true peak is at the limit of -2.0 dBTP", QvLogMask::warning));
+    WideDecoder silent(Values(6 * 48000, 0), 6);
+    QvLoudness silence;
+    play(silent, {{"normalizer", AnyDict("mode", "loudness")}}, 0, 48000, silence);
+    EXPECT_EQ(silence.samplePeak(), QvLoudness::silence);
+}
+
+}  // namespace
