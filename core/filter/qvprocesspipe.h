@@ -42,7 +42,8 @@ class QV_API QvAProcessPipe : public QvAudioFilter {
 
     virtual int addFilter(QvAudioFilter* filter, int position) = 0;  // as for video
     // Brings the output buffer up to `samples` samples, reading that audio stream as needed. 0; -4 when they
-    // are there but go beyond the end of the input (what it lacked is silence); a filter's error as it stands.
+    // are there but go beyond the end of the input (what it lacked is silence); a filter's error as it
+    // stands.
     virtual int process(QvDecodePipe* decoder, int stream, int samples) = 0;
     virtual int removeFilter(int position) = 0;
     virtual int clear() = 0;

@@ -55,6 +55,6 @@ class Events {
     void endNow(int status);
 };
 
-// For the end of the process in the middle of its work: the whole line for people ("tarsel: ...\n"; none if it
-// is empty), in one write and only if there is room for it, and "end".
+// For the end of the process in the middle of its work: the whole line for people ("tarsel: ...\n"; none if
+// it is empty), in one write and only if there is room for it, and "end".
 void lastWords(std::string_view line, int status);

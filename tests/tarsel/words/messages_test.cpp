@@ -18,10 +18,10 @@ const std::set<std::string> kNaming = {"{file}", "{name}", "{option}"};
 
 // What needs to name neither: it is about the whole call, or names its subject itself.
 const std::set<Msg> kNamesNothing = {
-    Msg::commandMissing,     Msg::commandLineWrong,  Msg::chainRefused, Msg::standardOutput,
-    Msg::outOfMemory,        Msg::engineFailed,      Msg::systemFailed, Msg::inputMissing,
-    Msg::captionsCut,        Msg::captionsLate,      Msg::leftRemoved,  Msg::toolHasNoThread,
-    Msg::streamNeedsFormat,  Msg::outputMissing,     Msg::stopping,     Msg::stopped,
+    Msg::commandMissing,     Msg::commandLineWrong, Msg::chainRefused, Msg::standardOutput,
+    Msg::outOfMemory,        Msg::engineFailed,     Msg::systemFailed, Msg::inputMissing,
+    Msg::captionsCut,        Msg::captionsLate,     Msg::leftRemoved,  Msg::toolHasNoThread,
+    Msg::streamNeedsFormat,  Msg::outputMissing,    Msg::stopping,     Msg::stopped,
     Msg::stoppedWithNothing, Msg::doneUnsaid,
     Msg::engineWarns,  // a sentence of the engine
 };
