@@ -1,7 +1,6 @@
 #include "builtin/pipes/encodepipe2.h"
 
 #include <cstring>
-#include <new>
 
 #include "builtin/creators.h"
 #include "builtin/pipes/output/memberaddress.h"
@@ -84,11 +83,6 @@ EncodePipe2::~EncodePipe2() {
     if (getState() == qvStateOpen) finish(true);
     setState(stateInitialised);
     builder_.removeAll(qvAllStreams);
-    try {
-        end_.drop();
-    } catch (const std::bad_alloc&) {
-        // What could not be reset goes with its sink.
-    }
 }
 
 int EncodePipe2::init() {

@@ -35,9 +35,11 @@ double parseAspect(const std::string& text, const std::string& option) {
 }  // namespace
 
 void requireFrame(const std::string& option, unsigned fourcc, int width, int height) {
-    QvFrame frame;
-    if (frame.init(fourcc, width, height) != QvStatus::ok)
+    QvFrame shape, frame;
+    unsigned char place = 0;  // for the shape alone: nothing is allocated or touched
+    if (shape.init(fourcc, width, height, &place) != QvStatus::ok)
         throw failure(Msg::frameTooLarge, {option, std::to_string(width) + "x" + std::to_string(height)});
+    if (frame.init(fourcc, width, height) != QvStatus::ok) throw failure(Msg::outOfMemory);
 }
 
 std::vector<std::string> engineWarnings() {

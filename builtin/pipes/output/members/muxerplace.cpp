@@ -1,5 +1,7 @@
 #include "builtin/pipes/output/members/muxerplace.h"
 
+#include <new>
+
 #include "builtin/pipes/output/members/pipehost.h"
 #include "core/arch/qvassert.h"
 #include "core/encode/muxerlimits_p.h"
@@ -33,6 +35,14 @@ int MuxerPlace::setSink(const char* module) {
     if (filename_.isValid()) qvOfferParam(*sink_, "filename", filename_);
     attach();
     return QvStatus::ok;
+}
+
+// What could not be reset for want of memory goes with its sink.
+MuxerPlace::~MuxerPlace() {
+    try {
+        drop();
+    } catch (const std::bad_alloc&) {
+    }
 }
 
 void MuxerPlace::drop() {

@@ -16,7 +16,7 @@ class QvPreset;
 class MuxerPlace {
   public:
     explicit MuxerPlace(PipeHost& host) : host_(host) {}
-    ~MuxerPlace() { drop(); }
+    ~MuxerPlace();
     MuxerPlace(const MuxerPlace&) = delete;
     MuxerPlace& operator=(const MuxerPlace&) = delete;
 
