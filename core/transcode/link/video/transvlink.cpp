@@ -375,6 +375,9 @@ int TransVLink::_processOneFrame() {
         }
         videoPipe_->write(*frame);
         result = videoPipe_->process(nullptr, 0);
+        // A filter without memory may lose every frame from here on.
+        if (result == QvStatus::needsInput && videoPipe_->errorCode() == QvStatus::outOfMemory)
+            return QvStatus::outOfMemory;
     }
     return result;
 }
