@@ -40,7 +40,9 @@ bool hasProperties(const json& value, const json& schema) {
 bool conforms(const json& value, const json& schema) {
     const auto fits = [&](const json& part) { return conforms(value, part); };
     if (value.is_object() && !hasProperties(value, schema)) return false;
-    for (const auto& [keyword, what] : schema.items()) {
+    for (const auto& entry : schema.items()) {
+        const std::string& keyword = entry.key();
+        const json& what = entry.value();
         const bool known = std::set<std::string>{"$schema",  "title", "description",         "properties",
                                                  "required", "then",  "additionalProperties"}
                                .count(keyword) > 0;
