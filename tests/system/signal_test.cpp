@@ -76,6 +76,7 @@ TEST_F(Signal, StopsAndLeavesWhatWasThere) {
 // A full standard error, to which the job tells its progress, is what a stop waits for; the end waits for
 // nothing.
 TEST_F(Signal, TheSecondEndsAtOnce) {
+    if (std::string(QV_SANITIZE) == "thread") GTEST_SKIP() << "its own lines would wait for room as well";
     int full[2];
     ASSERT_EQ(pipe2(full, 0), 0);
     fcntl(full[1], F_SETFL, O_NONBLOCK);
