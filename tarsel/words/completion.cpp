@@ -134,7 +134,7 @@ std::string bash(const ToolText& tool) {
 
 // --- zsh
 
-// Colons and brackets end a part of a specification.
+// Colons and brackets have a meaning in the descriptions that zsh takes.
 std::string escaped(const std::string& text) {
     std::string out;
     for (const char c : text) {
