@@ -281,7 +281,9 @@ struct QvSubtitleRender::Private {
             converter = std::make_unique<QvColorConverter>(text.fourcc, !hd, hd);
         converterFourcc = text.fourcc;
         converterHd = hd;
-        return converter->convert(band, out) == QvStatus::ok;
+        const int result = converter->convert(band, out);
+        if (result == QvStatus::outOfMemory) throw std::bad_alloc();
+        return result == QvStatus::ok;
     }
 
     // Letters of the colour on black, which the mask then shows around them.
