@@ -190,9 +190,9 @@ int XmlParser::storeXmlTree(const Any& path, XmlNode* root, const char* doctype)
     if (!stream)
         throw QvFileException(Any::sprintf("Can not open '%s' for writing", name.asString("")).asString());
 
-    std::fputs("<?xml version=\"1.0\" encoding=\"UTF-8\" ?>\n", stream);
-    if (doctype) std::fprintf(stream, "<!DOCTYPE %s>\n", doctype);
-    const bool taken = root->write(stream, 0) == 0;
+    const bool begun = std::fputs("<?xml version=\"1.0\" encoding=\"UTF-8\" ?>\n", stream) >= 0 &&
+                       (!doctype || std::fprintf(stream, "<!DOCTYPE %s>\n", doctype) >= 0);
+    const bool taken = begun && root->write(stream, 0) == 0;
     const bool failed = !taken || std::fflush(stream) != 0 || std::ferror(stream);
     const bool closed = isStandard(stream) || std::fclose(stream) == 0;
     if (failed || !closed)
