@@ -78,7 +78,8 @@ int QvFileBufStream::openOutput(const QvWideString& name) {
     }
     const bool patchable = !Record::of(records_->file)->isStream();
     records_->patch = seekPatchNew(records_->file, patchable, tellObservers, this, failure());
-    return QvStatus::ok;
+    // A file whose header could not be filled in would pass for a complete one.
+    return records_->patch || name.size() >= longestPatchedName ? QvStatus::ok : QvStatus::outOfMemory;
 }
 
 int QvFileBufStream::openInput(const QvWideString& name) {

@@ -100,7 +100,7 @@ void SeekPatch::done(int abort) {
 
 bufstream* seekPatchNew(bufstream* inner, bool patchable, AuxInfoCallback callback, void* context,
                         std::shared_ptr<QvIoFailure> failure) {
-    std::array<unsigned short, 2048> name{};
+    std::array<unsigned short, longestPatchedName> name{};
     if (inner->auxinfo(inner, 0, QvAuxId::FILE_NAME_INFO, name.data(), sizeof name)) return nullptr;
     if (!name[0]) return nullptr;
     return RecordOf<SeekPatch>::make(
