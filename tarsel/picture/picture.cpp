@@ -335,6 +335,14 @@ std::string without(std::string sentence, const std::string& name) {
     return sentence;
 }
 
+// A sentence of the engine without the class in front ("QvScalerCC::") and its exclamation mark.
+std::string withoutClass(std::string sentence) {
+    const size_t name = sentence.find_first_of(" :");
+    if (name != std::string::npos && sentence.compare(name, 2, "::") == 0) sentence.erase(0, name + 2);
+    if (sentence.ends_with('!')) sentence.pop_back();
+    return sentence;
+}
+
 // Opens a filter for a moment. One that writes a file would make it then, so it has to wait for the run.
 void tryFilter(QvVideoFilter& filter) {
     if (const std::string written = filterFile(filter, QV_GUI_FILESELECT_SAVE); !written.empty()) {
@@ -360,7 +368,7 @@ void tryFilter(QvVideoFilter& filter) {
         requireFile(read);
         throw failure(Msg::filterFileRefused, {filter.name(), read, without(reason, read)});
     }
-    throw failure(Msg::filterRefused, {filter.name(), reason});
+    throw failure(Msg::filterRefused, {filter.name(), withoutClass(reason)});
 }
 
 // What differs from the values that a filter begins with.

@@ -13,7 +13,7 @@ import tempfile
 import jobs
 
 PATIENCE = 60  # seconds; a run that takes longer hangs
-INTERNAL = re.compile(r"Qv|qv[A-Z_]|::|bad_alloc|\.tarsel-|assert|std::", re.IGNORECASE)
+INTERNAL = re.compile(r"\b[Qq]v[A-Z_]|::|bad_alloc|\.tarsel-|[Aa]ssert")  # names of temporary folders may have "qv"
 CRASH = re.compile(r"Sanitizer|runtime error|terminate called|core dumped")
 ASIDE = ("tarsel: warning: ", "tarsel: wrote ", "tarsel: stopping; ")
 STOPPED = {signal.SIGHUP: 129, signal.SIGINT: 130, signal.SIGTERM: 143}
