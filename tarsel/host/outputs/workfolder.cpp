@@ -3,6 +3,7 @@
 #include <cerrno>
 #include <cstring>
 #include <filesystem>
+#include <utility>
 
 #include <dirent.h>
 #include <fcntl.h>
@@ -102,17 +103,19 @@ WorkFolder::Removed WorkFolder::remove() {
     if (!folder_) return removed;
     unlinkat(folder_.get(), Manifest::kMovingOldIn, 0);
     unlinkat(folder_.get(), Manifest::kMovingNewOut, 0);
-    // What is removed while a folder is listed may hide other entries.
-    while (removeOnce(folder_.get(), removed) > 0) {
+    // What is removed while a folder is listed may hide other entries, and where a signal ends the run, its
+    // other threads may still make files here. What twice can't be removed, such as a folder that somebody
+    // has put there, stays with its owner's name: the next run tries again.
+    for (bool stuck = false;;) {
+        if (removeOnce(folder_.get(), removed) > 0) {
+            stuck = false;
+        } else if (holdsMore(folder_.get())) {
+            if (std::exchange(stuck, true)) break;
+        } else {
+            unlinkat(folder_.get(), kOwner, 0);
+            if (unlinkat(place_.get(), name_.c_str(), AT_REMOVEDIR) == 0 || errno != ENOTEMPTY) break;
+        }
     }
-    // What can't be removed, such as a folder that somebody has put there, stays with its owner's name: the
-    // next run tries again.
-    if (holdsMore(folder_.get())) {
-        leave();
-        return removed;
-    }
-    unlinkat(folder_.get(), kOwner, 0);
-    unlinkat(place_.get(), name_.c_str(), AT_REMOVEDIR);
     leave();
     return removed;
 }
