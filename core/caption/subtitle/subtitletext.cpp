@@ -64,7 +64,8 @@ int SubtitleBytes::read(const Any& filename) {
     }
     size_ = std::fread(memory_.get(), 1, static_cast<std::size_t>(length), file.get());
     std::fill_n(memory_.get() + size_, room - size_, '\0');
-    return std::ferror(file.get()) ? QvStatus::failed : QvStatus::ok;
+    // A file that got shorter meanwhile is being written.
+    return size_ == static_cast<std::size_t>(length) ? QvStatus::ok : QvStatus::failed;
 }
 
 SubtitleMark findMark(std::string_view bytes) {
