@@ -1,5 +1,6 @@
 #include "tarsel/host/keyboard.h"
 
+#include <cerrno>
 #include <mutex>
 #include <system_error>
 
@@ -10,7 +11,8 @@
 
 namespace {
 
-std::mutex g_lock;  // of the mode of the terminal
+std::mutex g_lock;    // of the mode of the terminal
+bool g_away = false;  // the process stops or is stopped; guarded by g_lock
 
 }  // namespace
 
@@ -38,11 +40,12 @@ struct Keyboard::Terminal {
             device = -1;
             return false;
         }
-        return take();
+        return g_away || take();
     }
 
+    // Again after each stop: of one that nobody announces only the shell knows, and it has changed the mode.
     bool take() {
-        if (taken || !inForeground() || tcgetattr(device, &former) != 0) return false;
+        if (!inForeground() || (!taken && tcgetattr(device, &former) != 0)) return false;
         termios keys = former;
         keys.c_lflag &= ~static_cast<tcflag_t>(ICANON | ECHO);
         taken = tcsetattr(device, TCSANOW, &keys) == 0;
@@ -66,16 +69,20 @@ Keyboard::Terminal*& Keyboard::current() {
 
 void Keyboard::giveBack() {
     const std::lock_guard guard(g_lock);
+    g_away = true;
     if (current()) current()->giveBack();
 }
 
 void Keyboard::take() {
     const std::lock_guard guard(g_lock);
+    g_away = false;
     if (current()) current()->take();
 }
 
 Keyboard::Keyboard(bool enabled, std::function<void(char)> pressed) : pressed_(std::move(pressed)) {
     if (!enabled) return;
+    // A stop comes before the terminal is taken, or finds it to give back.
+    const std::lock_guard guard(g_lock);
     terminal_ = std::make_unique<Terminal>();
     try {
         if (terminal_->open()) thread_ = std::thread([this] { listen(); });
@@ -83,8 +90,6 @@ Keyboard::Keyboard(bool enabled, std::function<void(char)> pressed) : pressed_(s
         // A job that gets by without a thread for keys needs no keys.
     }
     if (!thread_.joinable()) terminal_.reset();
-    if (!terminal_) return;
-    const std::lock_guard guard(g_lock);
     current() = terminal_.get();
 }
 
@@ -100,7 +105,11 @@ Keyboard::~Keyboard() {
 void Keyboard::listen() {
     pollfd watched[] = {{terminal_->wake[0], POLLIN, 0}, {terminal_->device, POLLIN, 0}};
     // In the background a read of the terminal would stop the process.
-    while (poll(watched, terminal_->taken ? 2 : 1, -1) >= 0) {
+    for (;;) {
+        if (poll(watched, terminal_->taken ? 2 : 1, -1) < 0) {
+            if (errno == EINTR) continue;
+            return;
+        }
         char key = 0;
         if (watched[0].revents & POLLIN) {
             if (read(watched[0].fd, &key, 1) != 1 || key == 'e') return;
