@@ -4,10 +4,12 @@
 #include <cmath>
 #include <cstdio>
 #include <filesystem>
+#include <new>
 
 #include "tarsel/commands/commands.h"
 #include "tarsel/commands/outputoptions.h"
 #include "tarsel/host/events.h"
+#include "tarsel/host/memory.h"
 #include "tarsel/host/outputs/outputs.h"
 #include "tarsel/host/outputs/streamoutput.h"
 #include "tarsel/host/plugins.h"
@@ -47,20 +49,25 @@ class Shrinker {
         setChecked(*scaler_, "outWidth", width, "--sheet");
         setChecked(*scaler_, "outHeight", height, "--sheet");
         setChecked(*scaler_, "FOURCC", static_cast<int>(QvFourcc::BGR3), "--sheet");
-        if (scaler_->open() != QvStatus::ok) throw failure(Msg::sheetFailed, {scaler_->errorDesc()});
+        if (scaler_->open() != QvStatus::ok) fail();
     }
     ~Shrinker() { scaler_->close(); }
 
     void convert(const QvFrame& from, QvFrame& to) {
         QvFrame copy(from);
-        if (scaler_->write(copy) != QvStatus::ok || scaler_->ready() == 0)
-            throw failure(Msg::sheetFailed, {scaler_->errorDesc()});
+        if (scaler_->write(copy) != QvStatus::ok || scaler_->ready() == 0) fail();
         to = *scaler_->frame();
         scaler_->next();
     }
 
   private:
+    [[noreturn]] void fail() const {
+        if (memory_.ranOut()) throw std::bad_alloc();
+        throw failure(Msg::sheetFailed, {scaler_->errorDesc()});
+    }
+
     std::unique_ptr<QvVideoFilter> scaler_;
+    MemoryWatch memory_;
 };
 
 void save(const QvFrame& picture, const Given& given) {

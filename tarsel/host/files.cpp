@@ -79,8 +79,12 @@ Failure failureOf(const std::system_error& error) {
 std::string firstBytes(const std::string& name, size_t most) {
     std::string bytes(most, '\0');
     FILE* file = std::fopen(name.c_str(), "rb");
-    bytes.resize(file ? std::fread(bytes.data(), 1, most, file) : 0);
-    if (file) std::fclose(file);
+    if (!file) refuseInput(name, errno);
+    errno = 0;
+    bytes.resize(std::fread(bytes.data(), 1, most, file));
+    const int error = errno;
+    std::fclose(file);
+    if (bytes.size() < most && error != 0) refuseInput(name, error);
     return bytes;
 }
 

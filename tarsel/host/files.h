@@ -23,7 +23,7 @@ void requireOwnLog(const std::string& name, const std::vector<std::string>& word
 // folder that it is in is named.
 Failure failureOf(const std::system_error& error);
 
-// The first bytes of a file, fewer where it ends or fails before.
+// The first bytes of a file, fewer where it ends before. A file that can't be read is refused.
 std::string firstBytes(const std::string& name, size_t most);
 
 // Why `name` is no folder whose entries can be read, in the same words; "" if it is one.

@@ -248,6 +248,7 @@ void Source::refuseFile(const std::string& decoder) const {
     if (isCaptionFile(name_)) codec->setParam("openParameters", captionParameters());
     codec->setParam("filename", name_.c_str());
     const bool opens = codec->open() == QvStatus::ok;
+    firstBytes(name_, 1);  // a disk that fails is no fault of the format
     if (decoder == "wavdec") refuseWav(name_);
     if (decoder == "sccdec") refuseScc(name_);
     const Any ext = QvFile::getExt(Any(name_.c_str()), true);

@@ -106,7 +106,8 @@ def crashed(outcome):
 def wording(outcome):
     """What is wrong with the message of a run that failed."""
     lines = [line for line in outcome.text.splitlines() if line.startswith("tarsel: ") and not line.startswith(ASIDE)]
-    if len(lines) != 1:
+    inputs = {line.split("'")[2] for line in lines if line.startswith("tarsel: can't open '")}
+    if len(lines) != max(len(inputs), 1):
         return f"fails with {len(lines)} messages (status {outcome.status}): {outcome.text.strip()!r}"
     if INTERNAL.search(outcome.text):
         return f"shows its inside: {outcome.text.strip()!r}"

@@ -97,6 +97,8 @@ class Planted(unittest.TestCase):
             ("rm b; " + FAILS, "", ""): "a old, b absent",
             ("rm -rf .tarsel-work; exit 4", "", ""): "0 messages",
             ("rm -rf .tarsel-work; echo 'tarsel: std::bad_alloc' >&2; exit 1", "", ""): "shows its inside",
+            ("rm -rf .tarsel-work; printf \"tarsel: can't open '%s'\\n\" a b >&2; exit 3", "", ""): None,
+            ("rm -rf .tarsel-work; printf \"tarsel: can't open '%s'\\n\" a a >&2; exit 3", "", ""): "2 messages",
             ("rm -rf .tarsel-work; exit 99", "", ""): "crashes (status 99)",
         }
         for parts, wrong in cases.items():

@@ -70,9 +70,11 @@ int WorkFolder::make(const std::string& place) {
     if (!place_) return errno;
     const std::string record = Owner::self().text();
     for (int attempt = 0; attempt < kAttempts; ++attempt) {
-        path_ = (std::filesystem::path(place) / (std::string(kPrefix) + "XXXXXX")).string();
+        // Nothing may need memory between the folder's making and its entry in folder_.
+        name_ = std::string(kPrefix) + "XXXXXX";
+        path_ = (std::filesystem::path(place) / name_).string();
         if (!mkdtemp(path_.data())) return errno;
-        name_ = std::filesystem::path(path_).filename().string();
+        path_.copy(name_.data(), name_.size(), path_.size() - name_.size());
         folder_.reset(openat(place_.get(), name_.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
         if (!folder_ && errno == ENOENT) continue;
         int error = folder_ ? 0 : errno;
