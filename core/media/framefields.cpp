@@ -203,11 +203,11 @@ int qvframes::copyBob(QvFrame& dst, const QvFrame& src) {
         const std::size_t unit = hasWords(src) ? 2 : 1;
         const auto count = static_cast<std::size_t>(rowBytes(dst, src, p)) / unit;
         const std::ptrdiff_t srcStride = src.stride(p);
-        for (int row = 0; row < dst.height(p); ++row) {
-            const unsigned char* upper = src.plane(p) + 2 * row * srcStride;
-            average(dst.plane(p) + static_cast<std::ptrdiff_t>(row) * dst.stride(p), upper, upper + srcStride,
-                    count);
-        }
+        const std::ptrdiff_t dstStride = dst.stride(p);
+        const unsigned char* upper = src.plane(p);
+        unsigned char* to = dst.plane(p);
+        for (int row = dst.height(p); row > 0; --row, upper += 2 * srcStride, to += dstStride)
+            average(to, upper, upper + srcStride, count);
     }
     dst.copyMeta(src);
     dst.framerate.setInterlaced(0);

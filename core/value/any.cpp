@@ -292,7 +292,24 @@ Any Any::sprintf(const char* format, ...) {
     return Any(length < 0 ? "" : buffer);
 }
 
-bool Any::operator==(const Any& other) const { return qvAnyEqual(*this, other); }
+bool Any::operator==(const Any& other) const {
+    if (type_ != other.type_ || size_ != other.size_) return false;
+    return type_ == Int32 ? asInt32() == other.asInt32() : qvSameContents(*this, other);
+}
+
 bool Any::operator<(const Any& other) const { return qvAnyBefore(*this, other); }
 bool Any::operator>(const Any& other) const { return type_ == other.type_ && qvAnyBefore(other, *this); }
-bool Any::isTrue() const { return qvAnyTrue(*this); }
+
+bool Any::isTrue() const {
+    switch (type_) {
+        case Int32: return asInt32() != 0;
+        case Int64: return asInt64() != 0;
+        case Float: return asFloat() != 0.0;
+        case String:
+        case WString: return size_ > 0;
+        case Dict:
+        case Vector: return size() > 0;
+        case Generic: return size_ != 0 || pointer() != nullptr;
+        default: return false;
+    }
+}

@@ -28,10 +28,9 @@ bool same(Span a, Span b) {
 
 }  // namespace
 
-bool qvAnyEqual(const Any& a, const Any& b) {
-    if (a.type() != b.type()) return false;
+bool qvSameContents(const Any& a, const Any& b) {
     switch (a.type()) {
-        case Any::Invalid: return a.isNull() == b.isNull();
+        case Any::Invalid: return true;
         case Any::Int32: return a.asInt32() == b.asInt32();
         case Any::Int64: return a.asInt64() == b.asInt64();
         case Any::Float: return a.asFloat() == b.asFloat();  // false for NaN, true for 0.0 and -0.0
@@ -40,10 +39,9 @@ bool qvAnyEqual(const Any& a, const Any& b) {
         case Any::Dict: return a.asDict() == b.asDict();
         case Any::Vector: return a.asVector() == b.asVector();
         case Any::Generic:
-            return a.size() == b.size() &&
-                   (a.asGeneric() == b.asGeneric() ||
-                    (a.size() > 0 &&
-                     std::memcmp(a.asGeneric(), b.asGeneric(), static_cast<std::size_t>(a.size())) == 0));
+            return a.asGeneric() == b.asGeneric() ||
+                   (a.size() > 0 &&
+                    std::memcmp(a.asGeneric(), b.asGeneric(), static_cast<std::size_t>(a.size())) == 0);
         case Any::Framerate: return a.asFramerate() == b.asFramerate();
         case Any::Point: return a.asPoint() == b.asPoint();
         case Any::Rect: return a.asRect() == b.asRect();
@@ -64,20 +62,6 @@ bool qvAnyBefore(const Any& a, const Any& b) {
         case Any::Float: return a.asFloat() < b.asFloat();
         case Any::String: return before(narrow(a), narrow(b));
         case Any::WString: return before(wide(a), wide(b));
-        default: return false;
-    }
-}
-
-bool qvAnyTrue(const Any& value) {
-    switch (value.type()) {
-        case Any::Int32: return value.asInt32() != 0;
-        case Any::Int64: return value.asInt64() != 0;
-        case Any::Float: return value.asFloat() != 0.0;
-        case Any::String:
-        case Any::WString:
-        case Any::Dict:
-        case Any::Vector: return value.size() > 0;
-        case Any::Generic: return value.size() != 0 || value.asGeneric() != nullptr;
         default: return false;
     }
 }

@@ -1,9 +1,9 @@
-// Order, equality and truth of values, by their types.
+// Equality and order of values, by their types.
 #pragma once
 
 #include "core/value/any.h"
 
-// Any's ==, < and isTrue, which say what is compared.
-bool qvAnyEqual(const Any& a, const Any& b);
+// Any's ==, for two values of one type and, but for containers, one size.
+bool qvSameContents(const Any& a, const Any& b);
+// Any's <.
 bool qvAnyBefore(const Any& a, const Any& b);
-bool qvAnyTrue(const Any& value);
