@@ -11,6 +11,7 @@
 #include "core/arch/qvassert.h"
 #include "core/arch/undo_p.h"
 #include "core/engine/files/qvfileutil.h"
+#include "core/engine/modules/moduletraits_p.h"
 #include "core/engine/modules/params.h"
 #include "core/engine/modules/qvmodule.h"
 #include "core/measure/fourcc.h"
@@ -182,7 +183,7 @@ int RawMux::openAll() {
 int RawMux::openAudio(int nr) {
     auto& output = *stream(qvAudioStream, nr);
     const auto* encoder = output.atachee();
-    const bool pcm = qvIsCodec(encoder, "rawaenc");
+    const bool pcm = encoder && qvModuleTraits(*encoder).uncompressed;
     output.setParam("isPcm", pcm ? 1 : 0);
     output.setParam("split", pcm && settings_.splitAudio ? 1 : 0);
     if (pcm)
@@ -199,8 +200,9 @@ int RawMux::openAudio(int nr) {
 int RawMux::openVideo(int nr) {
     auto& output = *stream(qvVideoStream, nr);
     const auto* encoder = output.atachee();
-    const bool raw = qvIsCodec(encoder, "rawvenc");
-    const bool split = settings_.splitVideo && (raw || qvIsCodec(encoder, "mj2kvenc"));
+    const ModuleTraits traits = encoder ? qvModuleTraits(*encoder) : ModuleTraits();
+    const bool raw = traits.uncompressed;
+    const bool split = settings_.splitVideo && (raw || traits.wholePictures);
     const bool png = split && settings_.rawAsPng && raw;
     const int digits =
         settings_.totalFrames >= 1

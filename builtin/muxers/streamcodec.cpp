@@ -1,15 +1,9 @@
 #include "builtin/muxers/streamcodec.h"
 
-#include <cstring>
-
 #include "core/encode/qvmuxer.h"
 #include "core/engine/modules/qvregistry.h"
 #include "core/preset/qvpresetmgr.h"
 #include "core/stream/qvbufstrm.h"
-
-bool qvIsCodec(const QvCodec* codec, const char* name) {
-    return codec && std::strcmp(codec->name(), name) == 0;
-}
 
 int qvIntParam(const QvCodec& codec, const char* name, int fallback) {
     const Any value = codec.getParam(name);

@@ -7,7 +7,6 @@
 class QvBufStream;
 class QvMuxer;
 
-bool qvIsCodec(const QvCodec* codec, const char* name);  // false for null
 int qvIntParam(const QvCodec& codec, const char* name, int fallback);
 // The encoder's "extension", else that of the stream, else `fallback`.
 Any qvStreamExtension(QvBufStream& stream, const char* fallback);

@@ -2,12 +2,12 @@
 
 #include <algorithm>
 #include <cmath>
-#include <cstring>
 
 #include "builtin/creators.h"
 #include "core/arch/qvassert.h"
 #include "core/decode/qvdecoder.h"
 #include "core/engine/log/qvlog.h"
+#include "core/engine/modules/moduletraits_p.h"
 #include "core/engine/status.h"
 
 namespace {
@@ -18,8 +18,6 @@ constexpr int minRequest = 16;  // a rate converter is never asked for less
 constexpr double sameRate = 0.0001;
 // Silence that filters may swallow at the end of the input before they count as stuck, in seconds.
 constexpr int maxSwallowedSeconds = 60;
-
-bool isRateConverter(const QvAudioFilter& filter) { return std::strcmp(filter.name(), "srconvert") == 0; }
 
 }  // namespace
 
@@ -45,7 +43,7 @@ int QvAf::open() {
         auto& filter = *member.filter;
         if (const int result = filter.open())
             return setError(result, "%s: %s", filter.name(), filter.errorDesc());
-        member.isRateConverter = isRateConverter(filter);
+        member.isRateConverter = qvModuleTraits(filter).convertsRate;
         member.wanted = 0;
         if (!member.isRateConverter) continue;
         const int in = filter.getParam("inSamplerate").asInt32(0);

@@ -6,6 +6,7 @@
 #include "core/arch/qvassert.h"
 #include "core/decode/qvdecoder.h"
 #include "core/engine/log/qvlog.h"
+#include "core/engine/modules/moduletraits_p.h"
 #include "core/engine/status.h"
 
 namespace {
@@ -16,7 +17,7 @@ constexpr std::size_t noGroup = static_cast<std::size_t>(-1);
 // A converter that repeats frames would let an in-place filter work on the same picture twice.
 bool mayFollow(const QvVideoFilter& last, const QvVideoFilter& filter) {
     if (!filter.applySupported()) return false;
-    return Any(last.name()) != "frconvert" || last.getParam("_safeToApplyAfter").isTrue();
+    return !qvModuleTraits(last).repeatsFrames || last.getParam("_safeToApplyAfter").isTrue();
 }
 
 }  // namespace

@@ -144,7 +144,6 @@ class QV_API XmlParser {
     static void s_startElementHandler(void* self, const char* name, const char** attrs);
     static void s_endElementHandler(void* self, const char* name);
     static void s_dataHandler(void* self, const char* text, int size);
-    bool tooManyObjects() const;
     void parseStream(void* stream, const Any& path);
     void _cleanup();
 };

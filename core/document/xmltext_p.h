@@ -16,6 +16,3 @@ Any qvXmlText(std::string_view text);
 
 // True for what may name an element or attribute.
 bool qvIsXmlName(const char* name);
-
-// The number of bytes that hexadecimal text describes: see XmlTrans::parseGeneric. Never negative.
-long long qvGenericLength(std::string_view text);

@@ -1,12 +1,13 @@
-// The automatic audio chain. Between its first and last stage samples are 32 bits wide.
+#include "core/filter/audiochain_p.h"
+
 #include <algorithm>
 #include <utility>
 
 #include "core/arch/qvassert.h"
+#include "core/engine/modules/moduletraits_p.h"
 #include "core/engine/qvutil.h"
 #include "core/filter/chainfilters_p.h"
 #include "core/filter/qvprocesspipe.h"
-#include "core/filter/qvprocessutil.h"
 #include "core/job/jobdescription.h"
 #include "core/measure/qvgeometry.h"
 
@@ -81,7 +82,7 @@ AudioFilterPtr newQuantizer(int bits) {
 // A delay that is not positive is no filter: the link skips that much input instead.
 void takeOutDelays(qvchain::AudioFilters& filters, MediaTime& startOffset) {
     std::erase_if(filters, [&](const AudioFilterPtr& filter) {
-        if (Any(filter->name()) != "adelay") return false;
+        if (!qvModuleTraits(*filter).delays) return false;
         const Any delay = filter->getParam("delay");
         const double ms =
             delay.isInt() || delay.isFloat() ? std::clamp(delay.toDouble(), -maxDelayMs, maxDelayMs) : 0.0;
@@ -97,7 +98,8 @@ void append(QvAProcessPipe& pipe, AudioFilterPtr filter) {
 
 }  // namespace
 
-QvAProcessPipe* QvProcessUtil::createAudioPipe(const AudioJobDescription& job, MediaTime& delayOut) {
+std::unique_ptr<QvAProcessPipe> qvchain::createAudioPipe(const AudioJobDescription& job,
+                                                         MediaTime& delayOut) {
     AnyVector frontStates;
     AnyVector backStates;
     QvUtil::getSortedEffects(job.filters, frontStates, backStates, true);
@@ -121,5 +123,5 @@ QvAProcessPipe* QvProcessUtil::createAudioPipe(const AudioJobDescription& job, M
     append(*pipe, std::move(rate));
     for (auto& filter : back) append(*pipe, std::move(filter));
     append(*pipe, newQuantizer(job.outBitsPerSample));
-    return pipe.release();
+    return pipe;
 }

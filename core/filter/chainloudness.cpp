@@ -1,8 +1,8 @@
 #include <algorithm>
-#include <cstring>
 #include <memory>
 
 #include "core/decode/qvdecoder.h"
+#include "core/engine/modules/moduletraits_p.h"
 #include "core/engine/modules/optionalparam_p.h"
 #include "core/engine/modules/params.h"
 #include "core/engine/status.h"
@@ -18,8 +18,6 @@ namespace {
 using Pipe = std::unique_ptr<QvAProcessPipe>;
 
 constexpr int blockSamples = 4096;
-
-bool isRateConverter(const QvAudioFilter& filter) { return std::strcmp(filter.name(), "srconvert") == 0; }
 
 // Some parameters are set by the chain's builder and not stored, so each that can be set and read is taken
 // over.
@@ -149,7 +147,7 @@ class Measurement {
     static long long outputOf(const QvAProcessPipe& chain, long long input) {
         for (int i = 0; i < chain.nrFilters(); ++i) {
             const QvAudioFilter& filter = *chain.filter(i);
-            if (!isRateConverter(filter)) continue;
+            if (!qvModuleTraits(filter).convertsRate) continue;
             const int in = filter.getParam("inSamplerate").asInt32(0);
             const int out = filter.getParam("outSamplerate").asInt32(0);
             if (in > 0 && out > 0) input = QvRatio::multyplyByRatio(input, QvRatio(out, 1), QvRatio(in, 1));

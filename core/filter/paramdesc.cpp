@@ -1,4 +1,5 @@
-// Descriptions of filter parameters for user interfaces.
+#include "core/filter/paramdesc_p.h"
+
 #include "core/arch/qvassert.h"
 #include "core/filter/qvprocessutil.h"
 
@@ -73,8 +74,8 @@ const char* findFault(const AnyDict& desc) {
 
 }  // namespace
 
-AnyDict QvProcessUtil::createParamDesc(const char* name, int type, int guiControl, const char* description,
-                                       const Any& min, const Any& max, const Any& step) {
+AnyDict qvCreateParamDesc(const char* name, int type, int guiControl, const char* description, const Any& min,
+                          const Any& max, const Any& step) {
     QV_ASSERT_MSG(name, "name");
     QV_ASSERT_MSG(isDescribable(type), "Currently only int32, float, string  and wstring types supported");
     AnyDict desc = baseDesc(name, type, guiControl, description);
@@ -90,8 +91,8 @@ AnyDict QvProcessUtil::createParamDesc(const char* name, int type, int guiContro
     return desc;
 }
 
-AnyDict QvProcessUtil::createParamDesc(const char* name, int type, int guiControl, const char* description,
-                                       const AnyVector& allowed) {
+AnyDict qvCreateParamDesc(const char* name, int type, int guiControl, const char* description,
+                          const AnyVector& allowed) {
     QV_ASSERT_MSG(name, "name");
     QV_ASSERT_MSG(isDescribable(type), "Currently only int32, float, string, and wstring types supported");
     QV_ASSERT_MSG(allOfType(allowed, type),
@@ -101,7 +102,7 @@ AnyDict QvProcessUtil::createParamDesc(const char* name, int type, int guiContro
     return desc;
 }
 
-bool QvProcessUtil::checkParamDesc(const AnyDict& desc, Any* error) {
+bool qvCheckParamDesc(const AnyDict& desc, Any* error) {
     constexpr int maxNameLength = 512;
     const Any& name = desc.get("name");
     if (!name.isString() || name.size() > maxNameLength) {

@@ -9,9 +9,14 @@
 #include "core/decode/qvdecoder.h"
 #include "core/encode/qvencodepipe.h"
 #include "core/engine/log/qvlog.h"
+#include "core/engine/modules/moduletraits_p.h"
 #include "core/engine/modules/optionalparam_p.h"
+#include "core/engine/status.h"
+#include "core/filter/audiochain_p.h"
 #include "core/filter/chainloudness_p.h"
+#include "core/filter/paramdesc_p.h"
 #include "core/filter/qvprocesspipe.h"
+#include "core/filter/videochain_p.h"
 #include "core/job/jobdescription.h"
 #include "core/measure/qvgeometry.h"
 #include "core/stream/qvbufstrm.h"
@@ -19,7 +24,9 @@
 namespace {
 
 bool hasDeinterlacer(const QvVProcessPipe* pipe) {
-    return pipe && (pipe->filter("deinterlace", 0) || pipe->filter("bobber", 0));
+    for (int i = 0; pipe && i < pipe->nrFilters(); ++i)
+        if (qvModuleTraits(*pipe->filter(i)).deinterlaces) return true;
+    return false;
 }
 
 const char* cropModeName(int mode) {
@@ -57,6 +64,26 @@ void giveReport(QvAudioFilter& filter, const AnyDict& levels) {
 
 }  // namespace
 
+QvVProcessPipe* QvProcessUtil::createVideoPipe(const VideoJobDescription& job) {
+    return createVideoPipeAux(job, nullptr, false);
+}
+
+QvVProcessPipe* QvProcessUtil::createVideoPipeMV(const VideoJobDescription& job, int nrViews) {
+    if (nrViews < 2) return createVideoPipe(job);
+    std::unique_ptr<QvVProcessPipe> pipe(createVideoPipeAux(job, "mvprocess", true));
+    if (!pipe) return nullptr;
+    pipe->setParam("nrViews", nrViews);
+    pipe->setParam("jobDescription", Any(static_cast<const void*>(&job)));
+    if (pipe->open() == QvStatus::ok) return pipe.release();
+    qv_dbg()->error("Can not open the video pipe for %d views: %s", nrViews, pipe->errorDesc());
+    return nullptr;
+}
+
+QvVProcessPipe* QvProcessUtil::createVideoPipeAux(const VideoJobDescription& job, const char* moduleName,
+                                                  bool deferOpen) {
+    return qvchain::createVideoPipe(job, moduleName ? moduleName : "vprocess", deferOpen).release();
+}
+
 void QvProcessUtil::adjustVideoEncoder(const VideoJobDescription& job, QvVProcessPipe* pipe,
                                        QvEncodePipe* encoderPipe, int encoderStream) {
     auto* encoder = encoderPipe->videoEncoder(encoderStream);
@@ -73,6 +100,10 @@ void QvProcessUtil::adjustVideoEncoder(const VideoJobDescription& job, QvVProces
     auto* cropper = pipe ? pipe->filter("cropper", 0) : nullptr;
     if (!cropper) return;
     qvSetOptionalParam(*encoder, "cropMode", cropModeName(cropper->getParam("mode").asInt32(0)));
+}
+
+QvAProcessPipe* QvProcessUtil::createAudioPipe(const AudioJobDescription& job, MediaTime& delayOut) {
+    return qvchain::createAudioPipe(job, delayOut).release();
 }
 
 void QvProcessUtil::applyStreamReport(QvAProcessPipe* pipe, QvDecodePipe* decoder, int decoderStream,
@@ -139,3 +170,13 @@ void QvProcessUtil::calculateSRAudioDelayCorrections(QvMuxer* muxer, AnyDict& di
     dict.set("video", video);
     dict.set("audio", audio);
 }
+
+AnyDict QvProcessUtil::createParamDesc(const char* name, int type, int guiControl, const char* description,
+                                       const Any& min, const Any& max, const Any& step) {
+    return qvCreateParamDesc(name, type, guiControl, description, min, max, step);
+}
+AnyDict QvProcessUtil::createParamDesc(const char* name, int type, int guiControl, const char* description,
+                                       const AnyVector& allowed) {
+    return qvCreateParamDesc(name, type, guiControl, description, allowed);
+}
+bool QvProcessUtil::checkParamDesc(const AnyDict& desc, Any* error) { return qvCheckParamDesc(desc, error); }

@@ -1,16 +1,15 @@
-// The automatic video chain: what a job needs, then the filters in their order.
+#include "core/filter/videochain_p.h"
+
 #include <cmath>
 #include <utility>
 
 #include "core/arch/qvassert.h"
 #include "core/arch/qvcancel.h"
-#include "core/engine/log/qvlog.h"
 #include "core/engine/modules/qvregistry.h"
 #include "core/engine/qvutil.h"
 #include "core/engine/status.h"
 #include "core/filter/chainfilters_p.h"
 #include "core/filter/qvprocesspipe.h"
-#include "core/filter/qvprocessutil.h"
 #include "core/job/jobdescription.h"
 #include "core/measure/qvgeometry.h"
 
@@ -209,26 +208,11 @@ void VideoChain::fill(QvVProcessPipe& pipe) {
 
 }  // namespace
 
-QvVProcessPipe* QvProcessUtil::createVideoPipe(const VideoJobDescription& job) {
-    return createVideoPipeAux(job, nullptr, false);
-}
-
-QvVProcessPipe* QvProcessUtil::createVideoPipeMV(const VideoJobDescription& job, int nrViews) {
-    if (nrViews < 2) return createVideoPipe(job);
-    std::unique_ptr<QvVProcessPipe> pipe(createVideoPipeAux(job, "mvprocess", true));
-    if (!pipe) return nullptr;
-    pipe->setParam("nrViews", nrViews);
-    pipe->setParam("jobDescription", Any(static_cast<const void*>(&job)));
-    if (pipe->open() == QvStatus::ok) return pipe.release();
-    qv_dbg()->error("Can not open the video pipe for %d views: %s", nrViews, pipe->errorDesc());
-    return nullptr;
-}
-
-QvVProcessPipe* QvProcessUtil::createVideoPipeAux(const VideoJobDescription& job, const char* moduleName,
-                                                  bool deferOpen) {
+std::unique_ptr<QvVProcessPipe> qvchain::createVideoPipe(const VideoJobDescription& job,
+                                                         const char* moduleName, bool deferOpen) {
     VideoChain chain(job);
     if (!chain.plan()) return nullptr;
-    std::unique_ptr<QvCodec> codec(qv_registry()->newCodec(moduleName ? moduleName : "vprocess"));
+    std::unique_ptr<QvCodec> codec(qv_registry()->newCodec(moduleName));
     auto* pipe = dynamic_cast<QvVProcessPipe*>(codec.get());
     QV_ASSERT_MSG(pipe, "invalid name for vprocess module");
     chain.fill(*pipe);
@@ -236,5 +220,5 @@ QvVProcessPipe* QvProcessUtil::createVideoPipeAux(const VideoJobDescription& job
     QV_ASSERT_MEMORY(opened != QvStatus::outOfMemory, pipe->errorDesc());
     QV_ASSERT_MSG(opened == QvStatus::ok, pipe->errorDesc());
     codec.release();
-    return pipe;
+    return std::unique_ptr<QvVProcessPipe>(pipe);
 }

@@ -8,13 +8,21 @@
 #include "core/arch/qvassert.h"
 #include "core/engine/log/qvlog.h"
 #include "core/engine/status.h"
-#include "core/media/rows_p.h"
+#include "core/media/framefields_p.h"
+#include "core/media/framefill_p.h"
+#include "core/media/frameparts_p.h"
 #include "core/value/ptrlist.h"
 
 namespace {
 
 constexpr std::align_val_t alignment{64};
 constexpr long long maxBytes = std::numeric_limits<int>::max();
+
+// Metadata with operations of its own.
+constexpr char timestampKey[] = "timestamp";
+constexpr char matrixKey[] = "_yuvMatrix";
+constexpr char userDataKey[] = "userData";
+constexpr char subpicKey[] = "subpic";
 
 // Strides and sizes of up to three planes.
 struct Layout {
@@ -127,14 +135,6 @@ void QvFrame::destroy() {
     memory_.reset();
 }
 
-bool QvFrame::sameFormat(unsigned four_cc, int width, int height) const {
-    return tt_.four_cc == four_cc && tt_.width == width && tt_.height == height;
-}
-
-int QvFrame::takeFormat(unsigned four_cc, int width, int height) {
-    return inited_ && sameFormat(four_cc, width, height) ? QvStatus::ok : init(four_cc, width, height);
-}
-
 int QvFrame::plane_bytes(int plane) const { return plane >= 0 && plane < planes_ ? planeBytes_[plane] : 0; }
 
 int QvFrame::bytes(int plane) const {
@@ -224,6 +224,101 @@ int QvFrame::changeFOURCC(unsigned four_cc) {
     text_ = qvFourccText(four_cc);
     return QvStatus::ok;
 }
+
+// --- Pictures and their parts
+
+int QvFrame::copy(const QvFrame& src, bool flip) { return qvframes::copy(*this, src, flip); }
+int QvFrame::copyFramett(const frame_tt& tt, bool keepStrides) {
+    return qvframes::copyFramett(*this, tt, keepStrides);
+}
+int QvFrame::copyShifted(const QvFrame& src) { return qvframes::copyShifted(*this, src); }
+int QvFrame::changeDominance(bool up) { return qvframes::changeDominance(*this, up); }
+int QvFrame::copySwitched(const QvFrame& src) { return qvframes::copySwitched(*this, src); }
+int QvFrame::interlace(const QvFrame& first, const QvFrame& second) {
+    return qvframes::interlace(*this, first, second);
+}
+int QvFrame::combineFields(const QvFrame& first, const QvFrame& second) {
+    return qvframes::combineFields(*this, first, second);
+}
+int QvFrame::copyDeinterlaced(const QvFrame& src, bool firstField) {
+    return qvframes::copyDeinterlaced(*this, src, firstField);
+}
+int QvFrame::copyBob(const QvFrame& src) { return qvframes::copyBob(*this, src); }
+
+int QvFrame::clip(const QvFrame& src, int srcX, int srcY, int dstX, int dstY, int width, int height) {
+    QV_ASSERT(inited_);
+    return qvframes::clip(*this, *format_, src, srcX, srcY, dstX, dstY, width, height);
+}
+int QvFrame::blend(int x, int y, const QvFrame& src, const QvFrame* mask, const QvFrame* chromaMask) {
+    QV_ASSERT(inited_);
+    return qvframes::blend(*this, *format_, x, y, src, mask, chromaMask);
+}
+int QvFrame::blend(int x, int y, const QvFrame& src, double alpha) {
+    QV_ASSERT(inited_);
+    return qvframes::blend(*this, *format_, x, y, src, alpha);
+}
+
+void QvFrame::setBlack() {
+    QV_ASSERT(inited_);
+    qvframes::setBlack(*this, *format_);
+}
+void QvFrame::setRGB(unsigned char r, unsigned char g, unsigned char b) { qvframes::setRGB(*this, r, g, b); }
+
+// --- Metadata
+
+void QvFrame::copyMeta(const QvFrame& src) { _copyMeta(src, nullptr); }
+
+// Entry by entry: those that are there already take the new values without a new place in memory.
+void QvFrame::_copyMeta(const QvFrame& src, const char* kept) {
+    framerate = src.framerate;
+    frameNr = src.frameNr;
+    if (&src == this) return;
+    for (int i = meta_.size() - 1; i >= 0; --i) {
+        const char* key = meta_.getKey(i);
+        if (!src.meta_.isSet(key) && !(kept && std::strcmp(key, kept) == 0)) meta_.remove(key);
+    }
+    for (auto [key, value] : src.meta_)
+        if (!(kept && std::strcmp(key, kept) == 0)) meta_.set(key, *value);
+}
+
+long long QvFrame::getTimestamp() const { return meta_.getInt64(timestampKey, -1); }
+
+void QvFrame::setTimestamp(long long timestamp) { meta_.set(timestampKey, Any(timestamp)); }
+
+QvYUVMatrix QvFrame::YUVMatrix() const {
+    return static_cast<QvYUVMatrix>(meta_.getInt32(matrixKey, qvMatrixNotSet));
+}
+
+void QvFrame::setYUVMatrix(QvYUVMatrix matrix) { meta_.set(matrixKey, Any(static_cast<int>(matrix))); }
+
+void QvFrame::copyMeta(const QvFrame& src, QvYUVMatrix matrix) {
+    _copyMeta(src, matrixKey);
+    setYUVMatrix(matrix);
+}
+
+QvUserData* QvFrame::userData() const {
+    return static_cast<QvUserData*>(meta_.get(userDataKey).asGeneric(nullptr));
+}
+
+void QvFrame::setUserData(QvUserData* data) { meta_.set(userDataKey, Any(static_cast<const void*>(data))); }
+
+void QvFrame::clearUserData() { meta_.remove(userDataKey); }
+
+AnyDict* QvFrame::subpic() {
+    Any& value = meta_.get(subpicKey);
+    return value.isDict() ? &value.asDict() : nullptr;
+}
+
+const AnyDict* QvFrame::subpic() const {
+    const Any& value = meta_.get(subpicKey);
+    return value.isDict() ? &value.asDict() : nullptr;
+}
+
+void QvFrame::setSubpic(const AnyDict& subpic) { meta_.set(subpicKey, subpic); }
+
+void QvFrame::clearSubpic() { meta_.remove(subpicKey); }
+
+// --- Views
 
 void QvFrame_linkViews(const TPtrList<QvFrame>& views) {
     QvFrame* before = nullptr;

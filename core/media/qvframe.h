@@ -177,8 +177,6 @@ class QV_API QvFrame {
     std::unique_ptr<unsigned char[], Release> memory_;
 
     void _copyMeta(const QvFrame& src, const char* kept);  // null, or the key of an entry that is left alone
-    bool sameFormat(unsigned four_cc, int width, int height) const;
-    int takeFormat(unsigned four_cc, int width, int height);
     void clearTails();
     std::ptrdiff_t pixelOffset(int x, int y, int plane) const;
 };

@@ -2,15 +2,19 @@
 
 #include <algorithm>
 #include <cmath>
+#include <cstdarg>
 #include <cstring>
 #include <limits>
 #include <memory>
 
 #include <string.h>
 
+#include "core/arch/cformat.h"
 #include "core/arch/qvassert.h"
 #include "core/measure/qvgeometry.h"
+#include "core/value/anycompare_p.h"
 #include "core/value/anycontainer.h"
+#include "core/value/anytext_p.h"
 
 namespace {
 
@@ -269,5 +273,43 @@ double Any::toDouble() const {
         case Int64: return static_cast<double>(asInt64());
         case Float: return asFloat();
         default: QV_FAIL_PLAIN();
+    }
+}
+
+Any Any::toString() const { return qvNarrowText(*this); }
+Any Any::toWString() const { return qvWideText(*this); }
+Any Any::substr(int start, int end) const { return qvTextPart(*this, start, end); }
+Any Any::replace(const Any& find, const Any& with) const { return qvTextReplaced(*this, find, with); }
+AnyVector Any::split(const Any& delimiter) const { return qvTextPieces(*this, delimiter); }
+Any Any::strcat(const Any& a, const Any& b) { return qvTextAppended(a, b); }
+
+Any Any::sprintf(const char* format, ...) {
+    char buffer[2048];
+    va_list args;
+    va_start(args, format);
+    const int length = qv_vformat(buffer, sizeof buffer, format, args);
+    va_end(args);
+    return Any(length < 0 ? "" : buffer);
+}
+
+bool Any::operator==(const Any& other) const {
+    if (type_ != other.type_ || size_ != other.size_) return false;
+    return type_ == Int32 ? asInt32() == other.asInt32() : qvSameContents(*this, other);
+}
+
+bool Any::operator<(const Any& other) const { return qvAnyBefore(*this, other); }
+bool Any::operator>(const Any& other) const { return type_ == other.type_ && qvAnyBefore(other, *this); }
+
+bool Any::isTrue() const {
+    switch (type_) {
+        case Int32: return asInt32() != 0;
+        case Int64: return asInt64() != 0;
+        case Float: return asFloat() != 0.0;
+        case String:
+        case WString: return size_ > 0;
+        case Dict:
+        case Vector: return size() > 0;
+        case Generic: return size_ != 0 || pointer() != nullptr;
+        default: return false;
     }
 }

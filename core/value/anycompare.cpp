@@ -1,10 +1,10 @@
-// Order, equality and truth of Any.
+#include "core/value/anycompare_p.h"
+
 #include <algorithm>
 #include <cstring>
 #include <span>
 
 #include "core/measure/qvgeometry.h"
-#include "core/value/any.h"
 #include "core/value/anycontainer.h"
 
 namespace {
@@ -28,57 +28,40 @@ bool same(Span a, Span b) {
 
 }  // namespace
 
-bool Any::operator==(const Any& other) const {
-    if (type_ != other.type_ || size_ != other.size_) return false;
-    switch (type_) {
-        case Invalid: return true;
-        case Int32: return asInt32() == other.asInt32();
-        case Int64: return asInt64() == other.asInt64();
-        case Float: return asFloat() == other.asFloat();  // false for NaN, true for 0.0 and -0.0
-        case String: return same(narrow(*this), narrow(other));
-        case WString: return same(wide(*this), wide(other));
-        case Dict: return asDict() == other.asDict();
-        case Vector: return asVector() == other.asVector();
-        case Generic:
-            return pointer() == other.pointer() ||
-                   (size_ > 0 &&
-                    std::memcmp(pointer(), other.pointer(), static_cast<std::size_t>(size_)) == 0);
-        case Framerate: return asFramerate() == other.asFramerate();
-        case Point: return asPoint() == other.asPoint();
-        case Rect: return asRect() == other.asRect();
-        case Bitrate: return asBitrate() == other.asBitrate();
-        case Pair: return asPair() == other.asPair();
-        case MediaTime:
-            return asMediaTime().value() == other.asMediaTime().value() &&
-                   asMediaTime().timescale() == other.asMediaTime().timescale();
+bool qvSameContents(const Any& a, const Any& b) {
+    switch (a.type()) {
+        case Any::Invalid: return true;
+        case Any::Int32: return a.asInt32() == b.asInt32();
+        case Any::Int64: return a.asInt64() == b.asInt64();
+        case Any::Float: return a.asFloat() == b.asFloat();  // false for NaN, true for 0.0 and -0.0
+        case Any::String: return same(narrow(a), narrow(b));
+        case Any::WString: return same(wide(a), wide(b));
+        case Any::Dict: return a.asDict() == b.asDict();
+        case Any::Vector: return a.asVector() == b.asVector();
+        case Any::Generic:
+            return a.asGeneric() == b.asGeneric() ||
+                   (a.size() > 0 &&
+                    std::memcmp(a.asGeneric(), b.asGeneric(), static_cast<std::size_t>(a.size())) == 0);
+        case Any::Framerate: return a.asFramerate() == b.asFramerate();
+        case Any::Point: return a.asPoint() == b.asPoint();
+        case Any::Rect: return a.asRect() == b.asRect();
+        case Any::Bitrate: return a.asBitrate() == b.asBitrate();
+        case Any::Pair: return a.asPair() == b.asPair();
+        case Any::MediaTime:
+            return a.asMediaTime().value() == b.asMediaTime().value() &&
+                   a.asMediaTime().timescale() == b.asMediaTime().timescale();
         default: return false;
     }
 }
 
-bool Any::operator<(const Any& other) const {
-    if (type_ != other.type_) return type_ < other.type_;
-    switch (type_) {
-        case Int32: return asInt32() < other.asInt32();
-        case Int64: return asInt64() < other.asInt64();
-        case Float: return asFloat() < other.asFloat();
-        case String: return before(narrow(*this), narrow(other));
-        case WString: return before(wide(*this), wide(other));
-        default: return false;
-    }
-}
-
-bool Any::operator>(const Any& other) const { return type_ == other.type_ && other < *this; }
-
-bool Any::isTrue() const {
-    switch (type_) {
-        case Int32: return asInt32() != 0;
-        case Int64: return asInt64() != 0;
-        case Float: return asFloat() != 0.0;
-        case String:
-        case WString: return size_ > 0;
-        case Dict:
-        case Vector: return size() > 0;
-        case Generic: return size_ != 0 || pointer() != nullptr;
+bool qvAnyBefore(const Any& a, const Any& b) {
+    if (a.type() != b.type()) return a.type() < b.type();
+    switch (a.type()) {
+        case Any::Int32: return a.asInt32() < b.asInt32();
+        case Any::Int64: return a.asInt64() < b.asInt64();
+        case Any::Float: return a.asFloat() < b.asFloat();
+        case Any::String: return before(narrow(a), narrow(b));
+        case Any::WString: return before(wide(a), wide(b));
         default: return false;
     }
 }

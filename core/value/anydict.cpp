@@ -1,5 +1,6 @@
 #include <algorithm>
 #include <bit>
+#include <cstdarg>
 #include <cstdint>
 #include <cstring>
 #include <iterator>
@@ -9,6 +10,7 @@
 
 #include "core/arch/qvassert.h"
 #include "core/value/anycontainer.h"
+#include "core/value/anypath_p.h"
 #include "core/value/astring.h"
 
 namespace {
@@ -266,6 +268,22 @@ bool AnyDict::operator==(const AnyDict& other) const {
         return std::strcmp(a.key, b.key) == 0 && *a.value == *b.value;
     };
     return size() == other.size() && std::equal(begin(), end(), other.begin(), equal);
+}
+
+Any* AnyDict::descendant(const char* format, ...) {
+    va_list args;
+    va_start(args, format);
+    Any* const found = AnyPath::find(*this, format, args);
+    va_end(args);
+    return found;
+}
+
+const Any* AnyDict::descendant(const char* format, ...) const {
+    va_list args;
+    va_start(args, format);
+    const Any* const found = AnyPath::find(*this, format, args);
+    va_end(args);
+    return found;
 }
 
 AnyDict::iterator AnyDict::begin() const {

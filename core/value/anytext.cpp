@@ -1,15 +1,13 @@
-// Text operations of Any.
+#include "core/value/anytext_p.h"
+
 #include <algorithm>
-#include <cstdarg>
 #include <iterator>
 #include <string>
 #include <vector>
 
-#include "core/arch/cformat.h"
 #include "core/arch/widename.h"
-#include "core/value/any.h"
 #include "core/value/anycontainer.h"
-#include "core/value/anytext_p.h"
+#include "core/value/utf.h"
 
 namespace {
 
@@ -111,54 +109,100 @@ Any part(View text, int start, int end) {
     return qvTextOf(View(text.data() + start, static_cast<std::size_t>(end - start)));
 }
 
+// Pieces between delimiters. An empty one is a String in both widths.
+template <class View>
+AnyVector pieces(View text, View delimiter) {
+    AnyVector result;
+    std::size_t first = 0;
+    if (!delimiter.empty()) QvUtf::next(delimiter, first);
+    const View mark(delimiter.data(), first);
+    auto from = text.begin();
+    while (true) {
+        const auto to = mark.empty() ? text.end() : std::search(from, text.end(), mark.begin(), mark.end());
+        result.append(from == to ? Any("") : qvTextOf(View(from, to)));
+        if (to == text.end()) return result;
+        from = to + static_cast<std::ptrdiff_t>(mark.size());
+    }
+}
+
+template <class Text, class Append>
+Any joined(const AnyVector& parts, const Any& separator, Append append) {
+    Text result;
+    bool first = true;
+    for (const Any& part : parts) {
+        if (!part.isText()) continue;
+        if (!first && separator.isTrue()) append(result, separator);
+        append(result, part);
+        first = false;
+    }
+    return qvTextOf(result);
+}
+
 }  // namespace
 
-Any Any::toString() const {
-    if (isString()) return *this;
-    if (!isWString()) return Any();
-    const QvWideView text = qvWideView(*this);
-    return qvTextOf(std::string_view(qv_narrow_name(text.data(), text.size())));
+Any qvNarrowText(const Any& text) {
+    if (text.isString()) return text;
+    if (!text.isWString()) return Any();
+    const QvWideView units = qvWideView(text);
+    return qvTextOf(std::string_view(qv_narrow_name(units.data(), units.size())));
 }
 
-Any Any::toWString() const {
-    if (isWString()) return *this;
-    if (!isString()) return Any();
-    const QvWideString text = qv_wide_name(qvNarrowView(*this));
-    return qvTextOf(QvWideView(text.data(), text.size()));
+Any qvWideText(const Any& text) {
+    if (text.isWString()) return text;
+    if (!text.isString()) return Any();
+    const QvWideString units = qv_wide_name(qvNarrowView(text));
+    return qvTextOf(QvWideView(units.data(), units.size()));
 }
 
-Any Any::substr(int start, int end) const {
-    QV_ASSERT_MSG(isText(), "Any.substr: invalid type");
-    if (size() == 0) return *this;
-    if (isWString()) return part(QvWideView(asWString(), static_cast<std::size_t>(size())), start, end);
-    return part(std::string_view(asString(), static_cast<std::size_t>(size())), start, end);
+Any qvTextPart(const Any& text, int start, int end) {
+    QV_ASSERT_MSG(text.isText(), "Any.substr: invalid type");
+    if (text.size() == 0) return text;
+    const auto size = static_cast<std::size_t>(text.size());
+    if (text.isWString()) return part(QvWideView(text.asWString(), size), start, end);
+    return part(std::string_view(text.asString(), size), start, end);
 }
 
-Any Any::replace(const Any& find, const Any& with) const {
-    QV_ASSERT(isText() && find.isText() && with.isText());
-    if (isString() && find.isString() && with.isString())
-        return replaced(unitsOf<char>(*this), unitsOf<char>(find), unitsOf<char>(with));
-    return replaced(widened(*this), unitsOf<unsigned short>(find.toWString()),
-                    unitsOf<unsigned short>(with.toWString()));
+Any qvTextReplaced(const Any& text, const Any& find, const Any& with) {
+    QV_ASSERT(text.isText() && find.isText() && with.isText());
+    if (text.isString() && find.isString() && with.isString())
+        return replaced(unitsOf<char>(text), unitsOf<char>(find), unitsOf<char>(with));
+    return replaced(widened(text), unitsOf<unsigned short>(qvWideText(find)),
+                    unitsOf<unsigned short>(qvWideText(with)));
 }
 
-AnyVector Any::split(const Any& delimiter) const { return AnyVector::split(*this, delimiter); }
-
-Any Any::strcat(const Any& a, const Any& b) {
+Any qvTextAppended(const Any& a, const Any& b) {
     if (a.isString() && b.isString()) {
         std::string joined(qvNarrowView(a));
         return qvTextOf(std::string_view(joined.append(qvNarrowView(b))));
     }
-    auto joined = unitsOf<unsigned short>(a.toWString());
-    std::ranges::copy(unitsOf<unsigned short>(b.toWString()), std::back_inserter(joined));
+    auto joined = unitsOf<unsigned short>(qvWideText(a));
+    std::ranges::copy(unitsOf<unsigned short>(qvWideText(b)), std::back_inserter(joined));
     return qvTextOf(QvWideView(joined));
 }
 
-Any Any::sprintf(const char* format, ...) {
-    char buffer[2048];
-    va_list args;
-    va_start(args, format);
-    const int length = qv_vformat(buffer, sizeof buffer, format, args);
-    va_end(args);
-    return Any(length < 0 ? "" : buffer);
+AnyVector qvTextPieces(const Any& text, const Any& delimiter) {
+    QV_ASSERT(text.isText() && delimiter.isText());
+    if (text.isWString()) return pieces(qvWideView(text), qvWideView(qvWideText(delimiter)));
+    return pieces(qvNarrowView(text), qvNarrowView(qvNarrowText(delimiter)));
+}
+
+Any qvTextsJoined(const AnyVector& parts, const Any& separator) {
+    bool wide = separator.isWString();
+    bool anything = false;
+    for (const Any& part : parts) {
+        if (!part.isText()) continue;
+        wide = wide || part.isWString();
+        anything = anything || part.size() > 0;
+    }
+    if (!anything) return Any::invalid();
+    if (!wide) {
+        const auto narrow = [](std::string& to, const Any& part) { to += qvNarrowView(part); };
+        return joined<std::string>(parts, separator, narrow);
+    }
+    const auto wider = [](std::vector<unsigned short>& to, const Any& part) {
+        const Any converted = qvWideText(part);
+        const auto text = qvWideView(converted);
+        to.insert(to.end(), text.begin(), text.end());
+    };
+    return joined<std::vector<unsigned short>>(parts, separator, wider);
 }

@@ -1,4 +1,5 @@
-// Views of the text that an Any holds, up to its first NUL, and the way back. Empty for other types.
+// The text that an Any holds: views of it up to its first NUL (empty for other types), the way back, and what
+// is made of texts. Any and AnyVector declare the operations for applications.
 #pragma once
 
 #include <algorithm>
@@ -37,3 +38,14 @@ inline Any qvTextOf(QvWideView text) {
     constexpr unsigned short nothing = 0;
     return text.empty() ? Any(&nothing) : Any(text.data(), qvTextLength(text.size()));
 }
+
+// Text as UTF-8 or as UTF-16, as Any::toString and toWString.
+Any qvNarrowText(const Any& text);
+Any qvWideText(const Any& text);
+// Any::substr, replace and strcat.
+Any qvTextPart(const Any& text, int start, int end);
+Any qvTextReplaced(const Any& text, const Any& find, const Any& with);
+Any qvTextAppended(const Any& a, const Any& b);
+// AnyVector::split and join.
+AnyVector qvTextPieces(const Any& text, const Any& delimiter);
+Any qvTextsJoined(const AnyVector& parts, const Any& separator);

@@ -1,5 +1,6 @@
-// Storage and positions of AnyVector.
 #include <algorithm>
+#include <cmath>
+#include <cstdarg>
 #include <cstddef>
 #include <memory>
 #include <utility>
@@ -7,6 +8,30 @@
 
 #include "core/arch/qvassert.h"
 #include "core/value/anycontainer.h"
+#include "core/value/anypath_p.h"
+#include "core/value/anytext_p.h"
+
+namespace {
+
+bool isNumber(const Any& value) { return value.isInt() || value.isFloat(); }
+
+// Any's operator<, made a strict weak order: NaN comes after all other Floats.
+bool before(const Any& a, const Any& b) {
+    if (a.isFloat() && b.isFloat() && (std::isnan(a.asFloat()) || std::isnan(b.asFloat())))
+        return !std::isnan(a.asFloat()) && std::isnan(b.asFloat());
+    return a < b;
+}
+
+template <class Before>
+void sortWith(AnyVector& vector, Before order) {
+    std::vector<Any> sorted;
+    sorted.reserve(static_cast<std::size_t>(vector.size()));
+    for (Any& element : vector) sorted.push_back(std::move(element));
+    std::ranges::stable_sort(sorted, order);
+    std::ranges::move(sorted, vector.begin());
+}
+
+}  // namespace
 
 // Each element has an address of its own, which it keeps whatever happens to the others.
 struct AnyVector::Impl {
@@ -173,4 +198,62 @@ void AnyVector::swap(AnyVector& other) {
 
 bool AnyVector::operator==(const AnyVector& other) const {
     return impl_ == other.impl_ || std::equal(begin(), end(), other.begin(), other.end());
+}
+
+int AnyVector::indexOf(const Any& value, int after) const {
+    for (int i = after < -1 ? 0 : after + 1; i < size(); ++i)
+        if (at(i) == value) return i;
+    return -1;
+}
+
+int AnyVector::ffind(double x, double epsilon) const {
+    for (int i = 0; i < size(); ++i)
+        if (at(i).isFloat() && std::fabs(at(i).asFloat() - x) < epsilon) return i;
+    return -1;
+}
+
+int AnyVector::nearest(const Any& value) const {
+    if (!isNumber(value)) return -1;
+    const double wanted = value.toDouble();
+    int best = -1;
+    double smallest = 0;
+    for (int i = 0; i < size() && isNumber(at(i)); ++i) {
+        const double distance = std::fabs(at(i).toDouble() - wanted);
+        if (best >= 0 && !(distance < smallest)) continue;
+        best = i;
+        smallest = distance;
+    }
+    return best;
+}
+
+Any AnyVector::join(const Any& separator) const { return qvTextsJoined(*this, separator); }
+AnyVector AnyVector::split(const Any& text, const Any& delimiter) { return qvTextPieces(text, delimiter); }
+
+void AnyVector::sort(bool reverse) {
+    if (reverse)
+        sortWith(*this, [](const Any& a, const Any& b) { return before(b, a); });
+    else
+        sortWith(*this, before);
+}
+
+void AnyVector::sortDicts(const char* key) {
+    for (const Any& element : *this) QV_ASSERT(element.isDict());
+    const auto valueOf = [key](const Any& dict) -> const Any& { return dict.asDict().get(key); };
+    sortWith(*this, [&](const Any& a, const Any& b) { return before(valueOf(a), valueOf(b)); });
+}
+
+Any* AnyVector::descendant(const char* format, ...) {
+    va_list args;
+    va_start(args, format);
+    Any* const found = AnyPath::find(*this, format, args);
+    va_end(args);
+    return found;
+}
+
+const Any* AnyVector::descendant(const char* format, ...) const {
+    va_list args;
+    va_start(args, format);
+    const Any* const found = AnyPath::find(*this, format, args);
+    va_end(args);
+    return found;
 }

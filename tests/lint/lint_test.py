@@ -92,6 +92,12 @@ class Planted(unittest.TestCase):
                  "core/media/h.cpp": "int names::g() {}\nvoid QvUtil::a() {}\n", "core/media/i.cpp": "void QvUtil::b() {}\n"}
         self.assertEqual(oneclass.check(self.tree(files), ()), [])
 
+    def test_members_that_return_what_is_above_their_class(self):
+        files = {"core/measure/rate.cpp": "int Rate::a() {}\n", "core/value/measurevalues.cpp": "Any Rate::b() {}\n"}
+        self.assertEqual(oneclass.check(self.tree(files), ()), [])
+        files["core/value/any.cpp"] = "Any Rate::c() {}\n"
+        self.assertEqual(len(oneclass.check(self.tree(files), ())), 1)
+
     def test_list_of_classes_in_several_sources_gets_shorter(self):
         self.assertEqual(len(oneclass.check(self.tree({"core/media/a.cpp": "int Thing::a() {}\n"}), ("Thing",))), 1)
 

@@ -1,10 +1,10 @@
 #include "builtin/pipes/output/outputpreparation.h"
 
 #include <algorithm>
-#include <cstring>
 
 #include "builtin/pipes/output/members/pipehost.h"
 #include "core/engine/log/qvlog.h"
+#include "core/engine/modules/moduletraits_p.h"
 #include "core/stream/qvbufstrm.h"
 
 namespace {
@@ -80,6 +80,6 @@ void OutputPreparation::adjustAudio() const {
     if (!end_.traits().manyPrograms) return;
     for (const auto& stream : streams_)
         if (stream->type == qvAudioStream && stream->encoder &&
-            std::strcmp(stream->encoder->name(), "aacaenc") == 0)
+            qvModuleTraits(*stream->encoder).family == CodecFamily::aac)
             qvOfferParam(*stream->encoder, "aacTsAdjust", 1);
 }

@@ -1,11 +1,8 @@
-// Caption pairs as the cc_data structure of a bitstream.
-//
-//     GA94 03 | 110ccccc FF | hh b1 b2 hh b1 b2 ... | FF      A/53; A/72 has B5 00 31 in front
-//             '------------ generic ---------------'
+#include "core/caption/cc/ccbuffer_p.h"
+
 #include <algorithm>
 #include <cstring>
 
-#include "core/caption/cc/qvcc.h"
 #include "core/engine/status.h"
 
 namespace {
@@ -37,28 +34,29 @@ const Layout* layoutOf(int fmt) {
 
 }  // namespace
 
-int QvCcData::detectBufferFmt(int size, const unsigned char* data) {
-    if (size >= 7 && std::memcmp(data, a53Head, sizeof a53Head) == 0) return a53;
-    // The byte that says cc_data is left to fromBuffer.
-    if (size >= 9 && std::memcmp(data, a72Head, sizeof a72Head - 1) == 0) return a72;
+int qvCcBufferFormat(int size, const unsigned char* data) {
+    if (size >= 7 && std::memcmp(data, a53Head, sizeof a53Head) == 0) return QvCcData::a53;
+    // The byte that says cc_data is checked when the buffer is read.
+    if (size >= 9 && std::memcmp(data, a72Head, sizeof a72Head - 1) == 0) return QvCcData::a72;
     return -1;
 }
 
-int QvCcData::byteSize(int fmt) const {
+int qvCcBufferSize(int fmt, int count) {
     const Layout* layout = layoutOf(fmt);
     if (!layout) return QvStatus::invalidArgument;
-    return layout->headSize + genericHead + pairBytes * count() + layout->tailSize;
+    return layout->headSize + genericHead + pairBytes * count + layout->tailSize;
 }
 
-int QvCcData::toBuffer(int fmt, int size, unsigned char* data) const {
+int qvWriteCcBuffer(const QvCcData& captions, int fmt, int size, unsigned char* data) {
     const Layout* layout = layoutOf(fmt);
     if (!layout) return QvStatus::invalidArgument;
-    if (count() > maxBufferPairs || size < byteSize(fmt)) return QvStatus::illegalState;
+    const int count = captions.count();
+    if (count > QvCcData::maxBufferPairs || size < qvCcBufferSize(fmt, count)) return QvStatus::illegalState;
     unsigned char* to = data;
     if (layout->head) to = std::copy_n(layout->head, layout->headSize, to);
-    *to++ = static_cast<unsigned char>(0x80 | (processCCDataFlag() ? processFlag : 0) | count());
+    *to++ = static_cast<unsigned char>(0x80 | (captions.processCCDataFlag() ? processFlag : 0) | count);
     *to++ = 0xFF;
-    for (const auto& pair : pairs_) {
+    for (const auto& pair : captions.pairs()) {
         *to++ = pair.header;
         *to++ = pair.byte1;
         *to++ = pair.byte2;
@@ -67,29 +65,30 @@ int QvCcData::toBuffer(int fmt, int size, unsigned char* data) const {
     return static_cast<int>(to - data);
 }
 
-int QvCcData::fromBuffer(int fmt, int size, const unsigned char* data, const MediaTime* t) {
+int qvReadCcBuffer(QvCcData& captions, int fmt, int size, const unsigned char* data, const MediaTime* t) {
     const Layout* layout = layoutOf(fmt);
     if (!layout) return QvStatus::invalidArgument;
-    if (fmt == generic) return _fromBufferGeneric(size, data, t);
-    clear();
+    if (fmt == QvCcData::generic) return qvReadCcPairs(captions, size, data, t);
+    captions.clear();
     if (size < layout->headSize ||
         std::memcmp(data, layout->head, static_cast<std::size_t>(layout->headSize)) != 0)
         return QvStatus::illegalState;
     // What follows the structure in a longer buffer is not ours.
-    return _fromBufferGeneric(std::min(size - layout->headSize, largestGeneric), data + layout->headSize, t);
+    return qvReadCcPairs(captions, std::min(size - layout->headSize, largestGeneric), data + layout->headSize,
+                         t);
 }
 
-int QvCcData::_fromBufferGeneric(int size, const unsigned char* data, const MediaTime* t) {
-    clear();
+int qvReadCcPairs(QvCcData& captions, int size, const unsigned char* data, const MediaTime* t) {
+    captions.clear();
     if (size < genericHead || size > largestGeneric) return QvStatus::illegalState;
-    const int number = data[0] & maxBufferPairs;
+    const int number = data[0] & QvCcData::maxBufferPairs;
     if (genericHead + pairBytes * number > size) return QvStatus::illegalState;
-    setProcessCCDataFlag((data[0] & processFlag) != 0);
+    captions.setProcessCCDataFlag((data[0] & processFlag) != 0);
     const MediaTime time = t ? *t : MediaTime();
-    for (const unsigned char* from = data + genericHead; count() < number; from += pairBytes) {
+    for (const unsigned char* from = data + genericHead; captions.count() < number; from += pairBytes) {
         QvCcBytePair pair(time, 0, from[1], from[2], false);
         pair.header = from[0];
-        append(pair);
+        captions.append(pair);
     }
     return QvStatus::ok;
 }

@@ -4,6 +4,7 @@
 #include <array>
 
 #include "core/caption/cc/cccharacters_p.h"
+#include "core/caption/cc/line21_p.h"
 #include "core/caption/cc/qvcc.h"
 
 namespace {
@@ -61,19 +62,17 @@ bool same(const std::vector<QvCcRow>& a, const std::vector<QvCcRow>& b) {
 // A receiver of one field: two memories, one of them on the screen.
 class Receiver {
   public:
-    explicit Receiver(bool hasServices) : hasServices_(hasServices) {}
+    explicit Receiver(bool hasServices) : line_(hasServices) {}
 
     void take(const MediaTime& now, int first, int second) {
         now_ = now;
-        if (first >= 0x10 && first < 0x20) {
-            takeControl(first, second);
-            return;
-        }
-        lastControl_ = 0;
-        if (hasServices_ && first != 0 && first < 0x10) inService_ = first != 0x0F;
-        if (first < 0x10 || inService_ || otherChannel_) return;
-        for (const int code : {first, second})
-            if (code >= 0x20) put(qvCcBasicCharacter(code));
+        const QvLine21Code code = line_.take(first, second);
+        if (code.kind == QvLine21Code::nothing) return;
+        if (code.kind != QvLine21Code::characters)
+            takeControl(code);
+        else if (code.first >= 0x10 && !otherChannel_)
+            for (const int byte : {code.first, code.second})
+                if (byte >= 0x20) put(qvCcBasicCharacter(byte));
     }
 
     std::vector<QvCcCue> finish() {
@@ -89,27 +88,18 @@ class Receiver {
   private:
     enum class Mode { none, popOn, rollUp, paintOn };
 
-    void takeControl(int first, int second) {
-        inService_ = false;
-        const int control = first << 8 | second;
-        const bool again = control == lastControl_;
-        lastControl_ = again ? 0 : control;  // sent twice, meant once
-        if (again) return;
-        otherChannel_ = (first & 8) != 0;
+    void takeControl(const QvLine21Code& code) {
+        otherChannel_ = code.secondChannel;
         if (otherChannel_) return;
-        const int code = first & 7;
-        if (second >= 0x40)
-            address(code, second);
-        else if (code == 1 && second >= 0x30)
-            put(qvCcSpecialCharacter(second));
-        else if (code == 1 && second >= 0x20)
-            changeStyle(second);
-        else if ((code == 2 || code == 3) && second >= 0x20)
-            putExtended(0x10 | code, second);
-        else if (code == 7 && second >= 0x21 && second <= 0x23)
-            column_ = std::min(column_ + second - 0x20, columnCount - 1);
-        else if (code == 4 || code == 5)
-            command(second);
+        switch (code.kind) {
+            case QvLine21Code::address: address(code.first, code.second); break;
+            case QvLine21Code::special: put(qvCcSpecialCharacter(code.second)); break;
+            case QvLine21Code::style: changeStyle(code.second); break;
+            case QvLine21Code::extended: putExtended(0x10 | code.first, code.second); break;
+            case QvLine21Code::tab: column_ = std::min(column_ + code.second - 0x20, columnCount - 1); break;
+            case QvLine21Code::command: command(code.second); break;
+            default: break;
+        }
     }
 
     // Rows in the order of their codes; each has two, by bit 5 of the second byte.
@@ -250,8 +240,8 @@ class Receiver {
     Mode mode_ = Mode::none;
     int row_ = rowCount, column_ = 0, depth_ = 2;
     bool italic_ = false;
-    bool hasServices_, inService_ = false, otherChannel_ = false;
-    int lastControl_ = 0;
+    QvLine21Reader line_;
+    bool otherChannel_ = false;
     MediaTime now_, changedAt_;
     bool pending_ = false;  // since changedAt_
     bool rolled_ = false;   // nothing has come after a carriage return

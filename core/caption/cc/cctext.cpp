@@ -3,25 +3,34 @@
 #include <string_view>
 
 #include "core/caption/cc/cccharacters_p.h"
+#include "core/caption/cc/line21_p.h"
 #include "core/caption/cc/qvcc.h"
 
 namespace {
 
 class Reader {
   public:
-    explicit Reader(bool hasServices) : hasServices_(hasServices) {}
+    explicit Reader(bool hasServices) : line_(hasServices) {}
 
     void take(int first, int second) {
-        if (first >= 0x10 && first < 0x20) {
-            takeControl(first, second);
-            return;
-        }
-        lastControl_ = 0;
-        if (hasServices_ && first != 0 && first < 0x10) {  // start, continue or, with 0x0F, end
-            inService_ = first != 0x0F;
-        } else if (!inService_) {
-            for (const int code : {first, second})
-                if (code >= 0x20) row_ += qvCcBasicCharacter(code);
+        const QvLine21Code code = line_.take(first, second);
+        switch (code.kind) {
+            case QvLine21Code::characters:
+                for (const int byte : {code.first, code.second})
+                    if (byte >= 0x20) row_ += qvCcBasicCharacter(byte);
+                break;
+            case QvLine21Code::address: endRow(); break;
+            case QvLine21Code::special: row_ += qvCcSpecialCharacter(code.second); break;
+            case QvLine21Code::style:
+            case QvLine21Code::tab: separate(); break;
+            case QvLine21Code::extended:
+                replaceLast(qvCcExtendedCharacter(0x10 | code.first, code.second));
+                break;
+            case QvLine21Code::command:
+                if (code.second == 0x21) removeLast();
+                if (code.second == 0x2D) endRow();
+                break;
+            default: break;
         }
     }
 
@@ -31,29 +40,6 @@ class Reader {
     }
 
   private:
-    void takeControl(int first, int second) {
-        inService_ = false;
-        const int control = first << 8 | second;
-        const bool again = control == lastControl_;
-        lastControl_ = again ? 0 : control;  // sent twice, meant once
-        if (again) return;
-        const int code = first & 0x17;  // without the channel
-        if (second >= 0x40)
-            endRow();  // an address
-        else if (code == 0x11 && second >= 0x30)
-            row_ += qvCcSpecialCharacter(second);
-        else if (code == 0x11 && second >= 0x20)
-            separate();  // a change of style takes a column
-        else if ((code == 0x12 || code == 0x13) && second >= 0x20)
-            replaceLast(qvCcExtendedCharacter(code, second));
-        else if (code == 0x17 && second >= 0x21 && second <= 0x23)
-            separate();  // a tab
-        else if ((code == 0x14 || code == 0x15) && second == 0x21)
-            removeLast();
-        else if ((code == 0x14 || code == 0x15) && second == 0x2D)
-            endRow();
-    }
-
     // An extended character follows a basic one for receivers that don't know it.
     void replaceLast(std::string_view character) {
         removeLast();
@@ -75,9 +61,7 @@ class Reader {
     }
 
     std::string text_, row_;
-    bool hasServices_;  // data services stand between the captions
-    int lastControl_ = 0;
-    bool inService_ = false;
+    QvLine21Reader line_;
 };
 
 }  // namespace

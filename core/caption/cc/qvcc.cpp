@@ -5,6 +5,8 @@
 #include <utility>
 
 #include "core/arch/qvassert.h"
+#include "core/caption/cc/ccbuffer_p.h"
+#include "core/caption/cc/sccpairs_p.h"
 #include "core/engine/status.h"
 #include "core/measure/exactmath_p.h"
 #include "core/measure/timecode.h"
@@ -189,6 +191,31 @@ int QvCcData::restore(const AnyDict& dict) {
     pairs_ = std::move(restored);
     process_ = dict["process"].isTrue();
     return QvStatus::ok;
+}
+
+// --- Bitstreams and files.
+
+int QvCcData::detectBufferFmt(int size, const unsigned char* data) { return qvCcBufferFormat(size, data); }
+int QvCcData::byteSize(int fmt) const { return qvCcBufferSize(fmt, count()); }
+int QvCcData::toBuffer(int fmt, int size, unsigned char* data) const {
+    return qvWriteCcBuffer(*this, fmt, size, data);
+}
+int QvCcData::fromBuffer(int fmt, int size, const unsigned char* data, const MediaTime* t) {
+    return qvReadCcBuffer(*this, fmt, size, data, t);
+}
+int QvCcData::_fromBufferGeneric(int size, const unsigned char* data, const MediaTime* t) {
+    return qvReadCcPairs(*this, size, data, t);
+}
+
+int QvCcData::readScc(const Any& filename, int type, bool detect, QvFramerate& rate, const bool* dropFrame,
+                      bool dropFrameLines) {
+    return qvReadScc(filename, type, detect, rate, dropFrame, dropFrameLines, pairs_);
+}
+std::string QvCcData::sccText(const QvFramerate& rate, const QvSccWriting& options) const {
+    return qvSccText(pairs_, rate, options);
+}
+int QvCcData::writeScc(const Any& filename, const QvFramerate& rate, const QvSccWriting& options) const {
+    return qvSaveScc(filename, sccText(rate, options));
 }
 
 // --- Log.

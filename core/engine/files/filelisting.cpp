@@ -1,4 +1,5 @@
-// Folders: what they hold, numbered sequences in them, and their removal.
+#include "core/engine/files/filelisting_p.h"
+
 #include <algorithm>
 #include <limits>
 #include <optional>
@@ -69,11 +70,6 @@ void listMatching(const Any& folder, const char* ext, AnyVector* out, Take take)
     for (const std::string& name : *names) out->append(qv_any_name(start + name, folder));
 }
 
-// "." and "..", and names that are nothing but an extension.
-bool isLeftOut(std::string_view name) {
-    return name == "." || name == ".." || (name.front() == '.' && name.rfind('.') == 0);
-}
-
 template <class C>
 std::size_t countLastDigits(const Text<C>& text) {
     const auto last = std::find_if(text.rbegin(), text.rend(), [](C c) { return c < C('0') || c > C('9'); });
@@ -121,40 +117,39 @@ void get_folder_plugin_dlls(const Any& folder, AnyVector* out) {
     listMatching(folder, "_plugin.so", out, [](const QvFolderEntry& entry) { return !entry.isFolder; });
 }
 
-AnyVector QvFile::ls(const Any& folder, int filesOnly) {
+bool qvIsUnlisted(std::string_view name) {
+    return name == "." || name == ".." || (name.front() == '.' && name.rfind('.') == 0);
+}
+
+AnyVector qvListFolder(const Any& folder, bool filesOnly) {
     AnyVector out;
     listMatching(folder, "", &out, [filesOnly](const QvFolderEntry& entry) {
-        return !isLeftOut(entry.name) && !(entry.isFolder && (filesOnly & 1));
+        return !qvIsUnlisted(entry.name) && !(entry.isFolder && filesOnly);
     });
     return out;
 }
 
-int QvFile::rmdir(const Any& name) {
-    const std::string folder = qv_os_name(name);
-    return folder.empty() ? -1 : qv_platform().removeTree(folder.c_str(), isLeftOut);
-}
-
 // Works on bytes for wide names too: the digits are the same, and equal length in bytes after an equal prefix
 // is equal length in units, since what follows is digits.
-AnyVector QvFile::numberedSequence(const Any& name, int* digits) {
+AnyVector qvNumberedSequence(const Any& name, int* digits) {
     int ignored;
     int& count = digits ? *digits : ignored;
     count = 0;
     if (!name.isText()) return {};
-    const std::string base = narrow(getBasename(name));
+    const std::string base = narrow(QvFile::getBasename(name));
     count = static_cast<int>(countLastDigits(base));
     if (count == 0) return {};
 
-    const Sequence sequence{narrow(getExt(name, false)), base.size(),
+    const Sequence sequence{narrow(QvFile::getExt(name, false)), base.size(),
                             base.substr(0, base.size() - static_cast<std::size_t>(count))};
-    const Any path = getPath(name);
+    const Any path = QvFile::getPath(name);
     std::vector<int> numbers;
     const auto collect = [&](const QvFolderEntry& entry) {
         const auto number = entry.isFolder ? std::nullopt : memberOf(sequence, entry.name);
         if (number) numbers.push_back(*number);
         return false;
     };
-    namesIn(path.size() > 0 ? osFname(path) : Any("."), collect);
+    namesIn(path.size() > 0 ? QvFile::osFname(path) : Any("."), collect);
     if (numbers.size() < 2) {
         count = 0;
         return {};

@@ -1,4 +1,5 @@
-// Files of one gzip stream: blocks that a decoder wants back as they were.
+#include "core/engine/files/gzipfile_p.h"
+
 #include <zlib.h>
 #include <algorithm>
 #include <limits>
@@ -38,7 +39,7 @@ bool readAll(gzFile file, std::vector<char>& bytes) {
 
 }  // namespace
 
-int QvFile::compress(const Any& name, const unsigned char* data, int size) {
+int qvWriteGzip(const Any& name, const unsigned char* data, int size) {
     if (size < 0 || (size > 0 && !data)) return -1;
     const gzFile file = openGzip(name, true);
     if (!file) return -1;
@@ -46,7 +47,7 @@ int QvFile::compress(const Any& name, const unsigned char* data, int size) {
     return gzclose(file) == Z_OK && whole ? 0 : -1;
 }
 
-int QvFile::decompress(const Any& name, Any& out) {
+int qvReadGzip(const Any& name, Any& out) {
     out.invalidate();
     const gzFile file = openGzip(name, false);
     if (!file) return -1;

@@ -1,15 +1,17 @@
-// Files and folders one at a time, and what else of the platform the engine asks by name.
 #include "core/engine/files/qvfileutil.h"
 
 #include <cstdio>
 #include <ctime>
+#include <type_traits>
 
 #include "core/arch/platform.h"
 #include "core/arch/qvassert.h"
+#include "core/engine/files/filelisting_p.h"
+#include "core/engine/files/gzipfile_p.h"
+#include "core/engine/files/nameparts_p.h"
 #include "core/engine/log/loggedopen_p.h"
 #include "core/engine/log/qvlog.h"
 #include "core/measure/datetime.h"
-#include "core/value/nametext_p.h"
 
 namespace {
 
@@ -53,7 +55,7 @@ Any qv_any_name(const std::string& bytes, const Any& like) {
 
 void* qvfopen(const Any& name, const char* mode) { return qvOpenLogged(name, mode); }
 
-const char* path_separator() { return "/"; }
+const char* path_separator() { return platformSeparator; }
 
 Any core_library_path() { return toAny(qv_platform().coreLibraryPath()); }
 
@@ -67,10 +69,99 @@ void debug_trace1(const char* first, const char* text) {
     qv_platform().debugOutput((std::string(first) + " " + text + "\n").c_str());
 }
 
+// --- Names
+
+Any QvFile::getPath(const Any& name) {
+    return inWidth(name, [](const auto& text) { return path(text); });
+}
+
+Any QvFile::getFilename(const Any& name) {
+    QV_ASSERT_MSG(name.isText(), "QvFile.getFilename: invalid argument type");
+    return inWidth(name, [](const auto& text) { return filename(text); });
+}
+
+Any QvFile::getBasename(const Any& name) {
+    QV_ASSERT_MSG(name.isText(), "QvFile.getBasename: invalid argument type");
+    return inWidth(name, [](const auto& text) { return basename(text); });
+}
+
+Any QvFile::getExt(const Any& name, bool lower) {
+    QV_ASSERT_MSG(name.isText(), "QvFile.getExt: filename argument must be string");
+    const Any ext = inWidth(name, [](const auto& text) { return extension(text); });
+    if (!lower) return ext;
+    Narrow text = narrow(ext);
+    for (char& c : text)
+        if (c >= 'A' && c <= 'Z') c = static_cast<char>(c - 'A' + 'a');
+    return toAny(text);
+}
+
+Any QvFile::stripExt(const Any& name) {
+    QV_ASSERT_MSG(name.isText(), "QvFile.stripExt: filename argument must be string");
+    return inWidth(name, [](const auto& text) {
+        const std::size_t length = extension(text).size();
+        return length == 0 ? text : text.substr(0, text.size() - length - 1);
+    });
+}
+
+Any QvFile::joinExt(const Any& name, const Any& ext) {
+    QV_ASSERT_MSG(name.isText(), "QvFile.joinExt: filename argument must be string");
+    QV_ASSERT_MSG(ext.isText(), "QvFile.joinExt: extension argument must be string");
+    return inWidth(name, [&ext](const auto& text) {
+        using C = typename std::decay_t<decltype(text)>::value_type;
+        return joinedExt(text, textOf<C>(ext));
+    });
+}
+
+Any QvFile::changeExt(const Any& name, const Any& ext) {
+    const Any file = AnyVector(getBasename(name), ext).join(Any("."));
+    return joinPath(getPath(name), file);
+}
+
+Any QvFile::joinPath(const Any& first, const Any& second) { return joinPath(AnyVector(first, second)); }
+
+Any QvFile::joinPath(const AnyVector& parts) {
+    if (parts.empty()) return Any("");
+    if (parts.size() == 1) return parts.at(0);
+    return hasWide(parts) ? toAny(joined<unsigned short>(parts)) : toAny(joined<char>(parts));
+}
+
+bool QvFile::isAbsolutePath(const Any& name) {
+    QV_ASSERT_MSG(name.isText(), "QvFile.isAbsolutePath: invalid argument type");
+    if (name.isWString()) {
+        QV_ASSERT(name.size() > 0);
+        return isAbsolute(wide(name));
+    }
+    QV_ASSERT(name.size() > 0);
+    return isAbsolute(narrow(name));
+}
+
+void QvFile::winFname(const Any& in, Any& out) { out = osFname(in); }
+
+Any QvFile::osFname(const Any& in) {
+    return inWidth(in, [](const auto& text) { return osName(text); });
+}
+
+bool QvFile::setSeparator(Any& name, char separator) {
+    bool changed = false;
+    const Any unified = inWidth(name, [&](auto text) {
+        using C = typename decltype(text)::value_type;
+        changed = unifySeparators(text, static_cast<C>(separator));
+        return text;
+    });
+    if (changed) name = unified;
+    return changed;
+}
+
+Any QvFile::shellEscape(const Any& text) {
+    return inWidth(text, [](const auto& plain) { return escaped(plain); });
+}
+
 Any QvFile::shellQuote(const Any& name) {
     if (!name.isText()) return Any();
     return qv_any_name(qv_platform().quoteForShell(qv_os_name(name)), name);
 }
+
+// --- Places and files
 
 Any QvFile::homeDir() { return toAny(qv_platform().homeFolder()); }
 
@@ -162,3 +253,17 @@ long long QvFile::freeSpace(const Any& name) {
     const std::string file = qv_os_name(name);
     return file.empty() ? -1 : qv_platform().freeSpace(file.c_str());
 }
+
+// --- Listings and gzip files
+
+AnyVector QvFile::ls(const Any& folder, int filesOnly) { return qvListFolder(folder, (filesOnly & 1) != 0); }
+AnyVector QvFile::numberedSequence(const Any& name, int* digits) { return qvNumberedSequence(name, digits); }
+
+int QvFile::rmdir(const Any& name) {
+    return withName(name, [](const char* folder) { return qv_platform().removeTree(folder, qvIsUnlisted); });
+}
+
+int QvFile::compress(const Any& name, const unsigned char* data, int size) {
+    return qvWriteGzip(name, data, size);
+}
+int QvFile::decompress(const Any& name, Any& out) { return qvReadGzip(name, out); }

@@ -22,7 +22,25 @@ constexpr Row fixedNames[] = {
     {"scaler", {.onlyScales = true}},
     {"aquant", {.convertsFormat = true}},
     {"chconvert", {.convertsFormat = true}},
-    {"srconvert", {.convertsFormat = true}},
+    {"srconvert", {.convertsFormat = true, .convertsRate = true}},
+    {"adelay", {.delays = true}},
+    {"deinterlace", {.deinterlaces = true}},
+    {"bobber", {.deinterlaces = true}},
+    {"frconvert", {.repeatsFrames = true}},
+    {"rawaenc", {.uncompressed = true}},
+    {"rawvenc", {.uncompressed = true}},
+    {"mj2kvenc", {.wholePictures = true}},
+};
+
+constexpr struct {
+    const char* attribute;
+    bool ModuleTraits::*trait;
+} switches[] = {
+    {"onlyScales", &ModuleTraits::onlyScales},       {"convertsFormat", &ModuleTraits::convertsFormat},
+    {"ownStatistics", &ModuleTraits::ownStatistics}, {"watchDiscSpace", &ModuleTraits::watchDiscSpace},
+    {"convertsRate", &ModuleTraits::convertsRate},   {"delays", &ModuleTraits::delays},
+    {"deinterlaces", &ModuleTraits::deinterlaces},   {"repeatsFrames", &ModuleTraits::repeatsFrames},
+    {"uncompressed", &ModuleTraits::uncompressed},   {"wholePictures", &ModuleTraits::wholePictures},
 };
 
 constexpr struct {
@@ -46,10 +64,6 @@ CodecFamily familyOf(std::string_view text) {
     return CodecFamily::none;
 }
 
-void apply(bool& trait, const QvModule& module, const char* attribute) {
-    if (const Any value = module.getAttr(attribute); value.isValid()) trait = value.isTrue();
-}
-
 }  // namespace
 
 ModuleTraits qvModuleTraits(std::string_view name, const QvModule* module) {
@@ -57,10 +71,8 @@ ModuleTraits qvModuleTraits(std::string_view name, const QvModule* module) {
     if (!module) return traits;
     if (const Any family = module->getAttr("codecFamily"); family.isString())
         traits.family = familyOf(family.asString());
-    apply(traits.onlyScales, *module, "onlyScales");
-    apply(traits.convertsFormat, *module, "convertsFormat");
-    apply(traits.ownStatistics, *module, "ownStatistics");
-    apply(traits.watchDiscSpace, *module, "watchDiscSpace");
+    for (const auto& [attribute, trait] : switches)
+        if (const Any value = module->getAttr(attribute); value.isValid()) traits.*trait = value.isTrue();
     return traits;
 }
 

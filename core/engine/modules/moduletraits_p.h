@@ -25,6 +25,20 @@ struct ModuleTraits {
     // "watchDiscSpace" (Int32): a multiplexer whose run ends when the disc is full, checked at each progress
     // report.
     bool watchDiscSpace = false;
+    // "convertsRate" (Int32): a filter of sound that converts from its "inSamplerate" to its "outSamplerate".
+    bool convertsRate = false;
+    // "delays" (Int32): a filter of sound that delays by its "delay", in milliseconds. In a chain that is
+    // built from a job a delay of 0 or less is no filter: that much of the input is skipped instead.
+    bool delays = false;
+    // "deinterlaces" (Int32): a filter that makes progressive pictures of interlaced ones.
+    bool deinterlaces = false;
+    // "repeatsFrames" (Int32): a filter that may hand out one picture several times, so that no filter may
+    // change it in place, unless its "_safeToApplyAfter" is 1.
+    bool repeatsFrames = false;
+    // "uncompressed" (Int32): an encoder that writes samples or pixels unchanged.
+    bool uncompressed = false;
+    // "wholePictures" (Int32): an encoder each of whose blocks is a picture that can be a file by itself.
+    bool wholePictures = false;
 
     bool operator==(const ModuleTraits&) const = default;
 };

@@ -10,6 +10,7 @@
 #include "core/engine/modules/params.h"
 #include "core/engine/modules/qvmodule.h"
 #include "core/engine/modules/qvregistry.h"
+#include "core/engine/modules/qvservices_p.h"
 #include "core/engine/qvutil.h"
 #include "core/engine/status.h"
 
@@ -173,3 +174,6 @@ void QvCodec::_traceParam(const char* name, const Any& value) const {
     if (state_ != stateCreated && qv_dbg()->hasTarget() && tracesParams())
         QvUtil::debugOutSetParam(this, name, value);
 }
+
+void* QvCodec::get_rc(const char* name) { return qvPlainService(name); }
+void* QvCodec::get_rc_ex(void*, const char* name) { return qvContextService(name); }

@@ -7,7 +7,10 @@
 #include "core/arch/qvassert.h"
 #include "core/engine/files/qvfileutil.h"
 #include "core/engine/log/qvlog.h"
+#include "core/engine/modules/decoderchoice_p.h"
+#include "core/engine/modules/moduleoverrides_p.h"
 #include "core/engine/modules/pluginfile_p.h"
+#include "core/engine/modules/qvcodec.h"
 #include "core/engine/modules/qvmodule.h"
 #include "core/engine/modules/qvplugin.h"
 #include "core/engine/modules/qvregistry_p.h"
@@ -29,6 +32,18 @@ Any fontFile(QvFontFace face) { return Any(qv_platform().fontFile(face).c_str())
 
 QvFontFace faceFor(int monospace, QvFontFace proportional) {
     return monospace ? QvFontFace::monospaceBold : proportional;
+}
+
+const char* withoutAlias(const char* name) {
+    const Any asked(name);
+    return asked == "colorconv" || asked == "scaler2" ? "scaler" : name;
+}
+
+QvKnownModules allModules(const std::deque<QvPlugin*>& plugins) {
+    QvKnownModules found;
+    for (const QvPlugin* plugin : plugins)
+        for (int i = 0; i < plugin->nrModules(); ++i) found.push_back(plugin->module(i));
+    return found;
 }
 
 }  // namespace
@@ -215,3 +230,78 @@ void QvRegistry::cleanup() {
     p_->failures.clear();
     qv_dbg()->setLogger(nullptr);
 }
+
+// --- Modules
+
+int QvRegistry::nrModules(int type) const {
+    int count = 0;
+    for (const QvPlugin* plugin : plugins_)
+        for (int i = 0; i < plugin->nrModules(); ++i)
+            if (type == 0 || plugin->module(i)->getAttr("type") == Any(type)) ++count;
+    return count;
+}
+
+QvModule* QvRegistry::module(int index) const {
+    for (const QvPlugin* plugin : plugins_) {
+        if (index < plugin->nrModules()) return plugin->module(index);
+        index -= plugin->nrModules();
+    }
+    return nullptr;
+}
+
+QvModule* QvRegistry::module(const char* name) const {
+    if (!name) return nullptr;
+    const Any wanted(withoutAlias(name));
+    for (const QvPlugin* plugin : plugins_)
+        for (int i = 0; i < plugin->nrModules(); ++i)
+            if (wanted == plugin->module(i)->name()) return plugin->module(i);
+    return nullptr;
+}
+
+QvCodec* QvRegistry::newCodec(const char* name) {
+    QvModule* found = module(name);
+    std::unique_ptr<QvCodec> codec(found ? found->create() : nullptr);
+    if (!codec || codec->init() != QvStatus::ok) return nullptr;
+    return codec.release();
+}
+
+AnyVector QvRegistry::modules(int type) const {
+    return type ? modules(AnyVector(Any(type))) : modules(AnyVector());
+}
+
+AnyVector QvRegistry::modules(const AnyVector& types) const {
+    AnyVector found;
+    for (QvModule* module : allModules(plugins_)) {
+        const Any type = module->getAttr("type");
+        if (!types.empty() && !(type.isInt32() && types.contains(type))) continue;
+        AnyDict row;
+        row.set("name", module->name());
+        row.set("desc", module->desc());
+        row.set("module", static_cast<const void*>(module));
+        found.append(row);
+    }
+    return found;
+}
+
+bool QvRegistry::isModuleEnabled(const char* name) const {
+    const QvModule* found = module(name);
+    return found && !qvIsDisabled(*found);
+}
+
+const AnyDict* QvRegistry::moduleDefaults(const char* name) const {
+    const Any& defaults = moduleDefaults_.get(name);
+    return defaults.isDict() ? &defaults.asDict() : nullptr;
+}
+
+bool QvRegistry::isOverriden(const QvModule* module) const {
+    const AnyDict* defaults = module ? moduleDefaults(module->name()) : nullptr;
+    return defaults && qvIsOverridden(*module, *defaults);
+}
+
+void QvRegistry::getModuleOverrides(AnyDict& overrides) const { qvCollectOverrides(*this, overrides); }
+void QvRegistry::setModuleOverrides(const AnyDict& overrides) { qvApplyOverrides(*this, overrides); }
+
+AnyVector* QvRegistry::inputExts(bool dot, bool star) const {
+    return qvInputExtensions(allModules(plugins_), dot, star).release();
+}
+AnyVector QvRegistry::decoders(const char* ext) const { return qvDecodersFor(allModules(plugins_), ext); }

@@ -1,4 +1,5 @@
-// What the engine offers to plug-in code with a plain C interface, by name.
+#include "core/engine/modules/qvservices_p.h"
+
 #include <cstdarg>
 #include <cstdint>
 #include <cstdlib>
@@ -8,7 +9,6 @@
 #include "core/arch/formattext_p.h"
 #include "core/arch/qvassert.h"
 #include "core/engine/log/qvlog.h"
-#include "core/engine/modules/qvcodec.h"
 
 namespace {
 
@@ -66,7 +66,7 @@ void* find(std::span<const Service> services, const char* name) {
 
 }  // namespace
 
-void* QvCodec::get_rc(const char* name) {
+void* qvPlainService(const char* name) {
     static const Service services[] = {
         {"malloc", pointer(allocate)},
         {"free", pointer(release)},
@@ -80,7 +80,7 @@ void* QvCodec::get_rc(const char* name) {
     return find(services, name);
 }
 
-void* QvCodec::get_rc_ex(void*, const char* name) {
+void* qvContextService(const char* name) {
     static const Service services[] = {
         {"err_printf", pointer(printAtWithContext<QvLogMask::error>)},
         {"wrn_printf", pointer(printAtWithContext<QvLogMask::warning>)},

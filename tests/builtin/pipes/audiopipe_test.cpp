@@ -1,5 +1,6 @@
 #include "builtin/pipes/audiopipe.h"
 
+#include "tests/builtin/pipes/initonce.h"
 #include "tests/support/checks.h"
 #include "tests/support/fake_filters.h"
 #include "tests/support/fake_streams.h"
@@ -37,15 +38,7 @@ struct Source : FakeDecoder {
 
 TEST(AudioPipe, IsInitialisedOnce) {
     Pipe pipe({"a"});
-    for (const bool open : {false, true}) {
-        if (open) {
-            EXPECT_EQ(pipe.open(), 0);
-        }
-        const auto state = pipe.getState();
-        EXPECT_EQ(pipe.init(), QvStatus::failed);
-        EXPECT_STREQ(pipe.errorDesc(), "Already initialized");
-        EXPECT_EQ(pipe.getState(), state);
-    }
+    expectInitialisedOnce(pipe);
 }
 
 TEST(AudioPipe, GivesWhatIsAskedFor) {

@@ -23,6 +23,8 @@ TEST(ModuleTraits, AFixedNameIsEnough) {
     EXPECT_EQ(traitsOf("scaler"), ModuleTraits{.onlyScales = true});
     EXPECT_EQ(traitsOf("mine"), ModuleTraits());
     EXPECT_EQ(traitsOf("asfmux"), ModuleTraits{.watchDiscSpace = true}) << "nobody has registered it";
+    EXPECT_EQ(traitsOf("bobber"), ModuleTraits{.deinterlaces = true});
+    EXPECT_EQ(traitsOf("frconvert"), ModuleTraits{.repeatsFrames = true});
     const std::unique_ptr<QvCodec> codec(qv_registry()->newCodec("scaler"));
     EXPECT_TRUE(qvModuleTraits(*codec).onlyScales);
 }
@@ -40,6 +42,14 @@ TEST(ModuleTraits, AnAttributeWins) {
     EXPECT_EQ(traitsOf("stats"), ModuleTraits{.ownStatistics = true});
     EXPECT_EQ(traitsOf("muxer"), ModuleTraits{.watchDiscSpace = true});
     EXPECT_EQ(traitsOf("sound"), ModuleTraits{.convertsFormat = true});
+    plugin.add(module("resampler", "convertsRate", 1)).add(module("adelay", "delays", 0));
+    plugin.add(module("weaver", "deinterlaces", 1)).add(module("frconvert", "repeatsFrames", 0));
+    plugin.add(module("plain", "uncompressed", 1)).add(module("stills", "wholePictures", 1));
+    EXPECT_EQ(traitsOf("resampler"), ModuleTraits{.convertsRate = true});
+    EXPECT_EQ(traitsOf("weaver"), ModuleTraits{.deinterlaces = true});
+    EXPECT_EQ(traitsOf("plain"), ModuleTraits{.uncompressed = true});
+    EXPECT_EQ(traitsOf("stills"), ModuleTraits{.wholePictures = true});
+    for (const char* name : {"adelay", "frconvert"}) EXPECT_EQ(traitsOf(name), ModuleTraits()) << name;
     EXPECT_EQ(traitsOf("camera").family, CodecFamily::dv);
 }
 

@@ -7,6 +7,7 @@
 #include "core/document/blockmemory_p.h"
 #include "core/document/xmldom.h"
 #include "core/document/xmltext_p.h"
+#include "core/document/xmlwriter_p.h"
 #include "core/value/anytext_p.h"
 #include "core/value/utf.h"
 
@@ -106,4 +107,10 @@ void XmlNode::deleteTree(XmlNode* node) {
         done->children_.clear();
         delete done;
     }
+}
+
+int XmlNode::write(void* stream, int indent) const {
+    if (!name()) return -1;
+    QV_ASSERT(stream && indent >= 0);
+    return qvWriteXml(*this, static_cast<std::FILE*>(stream), indent);
 }

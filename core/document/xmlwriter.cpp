@@ -1,3 +1,5 @@
+#include "core/document/xmlwriter_p.h"
+
 #include <algorithm>
 #include <cctype>
 #include <cstdio>
@@ -9,9 +11,7 @@
 
 #include <expat.h>
 
-#include "core/arch/qvassert.h"
 #include "core/arch/qvexception.h"
-#include "core/document/xmldom.h"
 #include "core/document/xmltext_p.h"
 #include "core/engine/files/qvfileutil.h"
 #include "core/value/anytext_p.h"
@@ -174,17 +174,14 @@ bool qvIsXmlName(const char* name) {
            XML_Parse(expat.get(), document.data(), static_cast<int>(document.size()), 1) == XML_STATUS_OK;
 }
 
-int XmlNode::write(void* stream, int indent) const {
-    if (!name()) return -1;
-    QV_ASSERT(stream && indent >= 0);
-    Writer writer(static_cast<std::FILE*>(stream), indent);
-    writer.write(*this);
+int qvWriteXml(const XmlNode& root, std::FILE* stream, int indent) {
+    Writer writer(stream, indent);
+    writer.write(root);
     return writer.failed() ? -1 : 0;
 }
 
-int XmlParser::storeXmlTree(const Any& path, XmlNode* root, const char* doctype) {
-    QV_ASSERT(root);
-    checkTree(path, *root);
+void qvStoreXml(const Any& path, const XmlNode& root, const char* doctype) {
+    checkTree(path, root);
     const Any name = path.toString();
     std::FILE* const stream = openTarget(path, name);
     if (!stream)
@@ -192,10 +189,9 @@ int XmlParser::storeXmlTree(const Any& path, XmlNode* root, const char* doctype)
 
     const bool begun = std::fputs("<?xml version=\"1.0\" encoding=\"UTF-8\" ?>\n", stream) >= 0 &&
                        (!doctype || std::fprintf(stream, "<!DOCTYPE %s>\n", doctype) >= 0);
-    const bool taken = begun && root->write(stream, 0) == 0;
+    const bool taken = begun && qvWriteXml(root, stream, 0) == 0;
     const bool failed = !taken || std::fflush(stream) != 0 || std::ferror(stream);
     const bool closed = isStandard(stream) || std::fclose(stream) == 0;
     if (failed || !closed)
         throw QvFileException(Any::sprintf("Can not write '%s'", name.asString("")).asString());
-    return 0;
 }

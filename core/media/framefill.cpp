@@ -1,9 +1,8 @@
-// Frames of one colour.
+#include "core/media/framefill_p.h"
+
 #include <array>
 #include <cstring>
 
-#include "core/arch/qvassert.h"
-#include "core/media/qvframe.h"
 #include "core/media/rows_p.h"
 
 namespace {
@@ -29,22 +28,22 @@ void fillPlane(unsigned char* plane, int stride, int planeBytes, const Pattern& 
 
 }  // namespace
 
-void QvFrame::setBlack() {
-    QV_ASSERT(inited_);
-    const Pattern chroma = format_->sampleBytes == 2 ? Pattern{0, 128, 0, 128} : Pattern{128, 128, 128, 128};
-    for (int p = 0; p < planes_; ++p)
-        fillPlane(tt_.planes[p], tt_.strides[p], planeBytes_[p], p ? chroma : blackPattern(four_cc()));
+void qvframes::setBlack(QvFrame& frame, const QvPixelFormat& format) {
+    const Pattern chroma = format.sampleBytes == 2 ? Pattern{0, 128, 0, 128} : Pattern{128, 128, 128, 128};
+    for (int p = 0; p < frame.planes(); ++p)
+        fillPlane(frame.plane(p), frame.stride(p), frame.bytes(p),
+                  p ? chroma : blackPattern(frame.four_cc()));
 }
 
-void QvFrame::setRGB(unsigned char r, unsigned char g, unsigned char b) {
-    if (!isRGB() || planeBytes_[0] == 0) return;
+void qvframes::setRGB(QvFrame& frame, unsigned char r, unsigned char g, unsigned char b) {
+    if (!frame.isRGB() || frame.bytes(0) == 0) return;
     // ARGB shares the step of BGR3, and keeps it.
-    const int step = four_cc() == QvFourcc::BGR4 || four_cc() == QvFourcc::BGRA ? 4 : 3;
-    unsigned char* pixel = tt_.planes[0];
-    for (int x = 0; x < tt_.width; ++x, pixel += step) {
+    const int step = frame.four_cc() == QvFourcc::BGR4 || frame.four_cc() == QvFourcc::BGRA ? 4 : 3;
+    unsigned char* pixel = frame.plane();
+    for (int x = 0; x < frame.width(); ++x, pixel += step) {
         pixel[0] = b;
         pixel[1] = g;
         pixel[2] = r;
     }
-    qvrows::repeatFirst(tt_.planes[0], tt_.strides[0], planeBytes_[0]);
+    qvrows::repeatFirst(frame.plane(), frame.stride(), frame.bytes(0));
 }

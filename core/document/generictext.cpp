@@ -1,11 +1,11 @@
-// Binary data as text: bytes as "1A ", runs of three or more equal ones as "10x AB ".
+#include "core/document/generictext_p.h"
+
+#include <algorithm>
 #include <charconv>
 #include <string>
 #include <string_view>
 #include <vector>
 
-#include "core/document/xmltext_p.h"
-#include "core/document/xmltrans.h"
 #include "core/value/numbertext_p.h"
 
 namespace {
@@ -46,10 +46,7 @@ long long qvGenericLength(std::string_view text) {
     return std::max(length, 0LL);
 }
 
-void XmlTrans::fromGeneric(const Any& from, XmlNode* to) {
-    to->setName("gen");
-    const std::string_view bytes(static_cast<const char*>(from.asGeneric()),
-                                 static_cast<std::size_t>(from.size()));
+std::string qvGenericText(std::string_view bytes) {
     std::string text;
     for (std::size_t i = 0; i < bytes.size();) {
         const std::size_t end = std::min(bytes.find_first_not_of(bytes[i], i), bytes.size());
@@ -61,13 +58,10 @@ void XmlTrans::fromGeneric(const Any& from, XmlNode* to) {
         while (count-- > 0) appendByte(text, static_cast<unsigned char>(bytes[i]));
         i = end;
     }
-    to->addRawData(text.data(), static_cast<int>(text.size()));
+    return text;
 }
 
-void XmlTrans::parseGeneric(const XmlNode* from, Any& to) {
-    std::string_view text(from->data(), static_cast<std::size_t>(from->dataSize()));
-    const long long length = qvGenericLength(text);
-    if (length > XmlParser::maxExpanded) return to.invalidate();
+std::vector<char> qvGenericBytes(std::string_view text, long long length) {
     std::vector<char> bytes;
     bytes.reserve(static_cast<std::size_t>(length));
     const auto room = [&] { return static_cast<long long>(bytes.capacity() - bytes.size()); };
@@ -80,5 +74,5 @@ void XmlTrans::parseGeneric(const XmlNode* from, Any& to) {
         bytes.insert(bytes.end(), static_cast<std::size_t>(std::min(count, room())), byteOf(token));
     }
     bytes.resize(static_cast<std::size_t>(length));
-    to.set(static_cast<const void*>(bytes.data()), static_cast<int>(length));
+    return bytes;
 }

@@ -1,4 +1,5 @@
-// Parts of pictures: copied into a frame, or drawn over it.
+#include "core/media/frameparts_p.h"
+
 #include <algorithm>
 #include <optional>
 
@@ -7,7 +8,6 @@
 #include "core/engine/status.h"
 #include "core/measure/exactmath_p.h"
 #include "core/media/pixelkernels_p.h"
-#include "core/media/qvframe.h"
 #include "core/media/rows_p.h"
 
 namespace {
@@ -131,38 +131,41 @@ bool checkMasks(const QvFrame& src, const QvFrame* mask, const QvFrame* chromaMa
 
 }  // namespace
 
-int QvFrame::clip(const QvFrame& src, int srcX, int srcY, int dstX, int dstY, int width, int height) {
-    QV_ASSERT(inited_ && src.inited_);
-    QV_ASSERT(four_cc() == src.four_cc());
-    QV_ASSERT_MSG(four_cc() != QvFourcc::v210, "Clip not supported for v210 colorspace");
-    const Area area = rounded({srcX, srcY, dstX, dstY, width, height}, *format_);
+int qvframes::clip(QvFrame& dst, const QvPixelFormat& format, const QvFrame& src, int srcX, int srcY,
+                   int dstX, int dstY, int width, int height) {
+    QV_ASSERT(dst.inited() && src.inited());
+    QV_ASSERT(dst.four_cc() == src.four_cc());
+    QV_ASSERT_MSG(dst.four_cc() != QvFourcc::v210, "Clip not supported for v210 colorspace");
+    const Area area = rounded({srcX, srcY, dstX, dstY, width, height}, format);
     QV_ASSERT(inside(area.srcX, area.width, src.width()));
     QV_ASSERT(inside(area.srcY, area.height, src.height()));
-    QV_ASSERT(inside(area.dstX, area.width, this->width()));
-    QV_ASSERT(inside(area.dstY, area.height, this->height()));
-    if (this == &src) return clip(QvFrame(src), srcX, srcY, dstX, dstY, width, height);
-    const int planes = format_->chroma == QvChroma::half ? 1 : planes_;
-    for (int p = 0; p < planes; ++p) copyArea(*this, src, p, inPlane(area, p));
-    framerate = src.framerate;
-    if (area.srcY % 2 != 0) framerate.reverseDominance();
-    if (area.dstY % 2 != 0) framerate.reverseDominance();
+    QV_ASSERT(inside(area.dstX, area.width, dst.width()));
+    QV_ASSERT(inside(area.dstY, area.height, dst.height()));
+    if (&dst == &src) return clip(dst, format, QvFrame(src), srcX, srcY, dstX, dstY, width, height);
+    const int planes = format.chroma == QvChroma::half ? 1 : dst.planes();
+    for (int p = 0; p < planes; ++p) copyArea(dst, src, p, inPlane(area, p));
+    dst.framerate = src.framerate;
+    if (area.srcY % 2 != 0) dst.framerate.reverseDominance();
+    if (area.dstY % 2 != 0) dst.framerate.reverseDominance();
     return QvStatus::ok;
 }
 
-int QvFrame::blend(int x, int y, const QvFrame& src, const QvFrame* mask, const QvFrame* chromaMask) {
-    if (!checkFormats(*this, src) || !checkMasks(src, mask, chromaMask)) return QvStatus::failed;
-    refuseUnblendable(*this);
-    const auto area = overlap(*this, src, x, y);
+int qvframes::blend(QvFrame& dst, const QvPixelFormat& format, int x, int y, const QvFrame& src,
+                    const QvFrame* mask, const QvFrame* chromaMask) {
+    if (!checkFormats(dst, src) || !checkMasks(src, mask, chromaMask)) return QvStatus::failed;
+    refuseUnblendable(dst);
+    const auto area = overlap(dst, src, x, y);
     if (!area) return QvStatus::ok;
-    if (this == &src) return blend(x, y, QvFrame(src), mask, chromaMask);
-    if (this == mask || this == chromaMask) {
-        const QvFrame apart(*this);
-        return blend(x, y, src, this == mask ? &apart : mask, this == chromaMask ? &apart : chromaMask);
+    if (&dst == &src) return blend(dst, format, x, y, QvFrame(src), mask, chromaMask);
+    if (&dst == mask || &dst == chromaMask) {
+        const QvFrame apart(dst);
+        return blend(dst, format, x, y, src, &dst == mask ? &apart : mask,
+                     &dst == chromaMask ? &apart : chromaMask);
     }
-    for (int p = 0; p < planes_; ++p) {
+    for (int p = 0; p < dst.planes(); ++p) {
         const Area part = inPlane(*area, p);
         if (!mask) {
-            copyArea(*this, src, p, part);
+            copyArea(dst, src, p, part);
             continue;
         }
         // Without a mask of its own the chroma takes every second row and column of the luma's.
@@ -170,29 +173,30 @@ int QvFrame::blend(int x, int y, const QvFrame& src, const QvFrame* mask, const 
         const QvFrame& from = p > 0 && chromaMask ? *chromaMask : *mask;
         const Area& maskArea = ownMask ? part : *area;
         const int step = ownMask ? 1 : 2;
-        forRows(*this, src, p, part, [&](Byte* dstRow, const Byte* srcRow, int row) {
-            maskRow(*format_, dstRow, srcRow, at(from, 0, maskArea.srcX, maskArea.srcY + step * row), step,
+        forRows(dst, src, p, part, [&](Byte* dstRow, const Byte* srcRow, int row) {
+            maskRow(format, dstRow, srcRow, at(from, 0, maskArea.srcX, maskArea.srcY + step * row), step,
                     part.width);
-            if (four_cc() == QvFourcc::b64a) clearFourthWords(dstRow, part.width);
+            if (dst.four_cc() == QvFourcc::b64a) clearFourthWords(dstRow, part.width);
         });
     }
     return QvStatus::ok;
 }
 
-int QvFrame::blend(int x, int y, const QvFrame& src, double alpha) {
-    if (!checkFormats(*this, src)) return QvStatus::failed;
-    refuseUnblendable(*this);
-    const auto area = overlap(*this, src, x, y);
+int qvframes::blend(QvFrame& dst, const QvPixelFormat& format, int x, int y, const QvFrame& src,
+                    double alpha) {
+    if (!checkFormats(dst, src)) return QvStatus::failed;
+    refuseUnblendable(dst);
+    const auto area = overlap(dst, src, x, y);
     if (!area) return QvStatus::ok;
-    if (this == &src) return blend(x, y, QvFrame(src), alpha);
+    if (&dst == &src) return blend(dst, format, x, y, QvFrame(src), alpha);
     const int weight = std::clamp(qvmath::truncTo<int>(alpha * 255 + 0.5), 0, 255);
-    const auto mix = format_->sampleBytes == 2 ? qvpixels::mixWords : qvpixels::mixBytes;
-    for (int p = 0; p < planes_; ++p) {
+    const auto mix = format.sampleBytes == 2 ? qvpixels::mixWords : qvpixels::mixBytes;
+    for (int p = 0; p < dst.planes(); ++p) {
         const Area part = inPlane(*area, p);
-        const int samples = part.width * format_->pixelBytes / format_->sampleBytes;
-        forRows(*this, src, p, part, [&](Byte* dstRow, const Byte* srcRow, int) {
+        const int samples = part.width * format.pixelBytes / format.sampleBytes;
+        forRows(dst, src, p, part, [&](Byte* dstRow, const Byte* srcRow, int) {
             mix(dstRow, srcRow, weight, static_cast<std::size_t>(samples));
-            if (four_cc() == QvFourcc::b64a) clearFourthWords(dstRow, part.width);
+            if (dst.four_cc() == QvFourcc::b64a) clearFourthWords(dstRow, part.width);
         });
     }
     return QvStatus::ok;

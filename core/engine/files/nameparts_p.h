@@ -1,16 +1,17 @@
-// File names as text: taking them apart and putting them together.
-#include <algorithm>
-#include <type_traits>
+// File names as text, in either width: taking them apart and putting them together. Both "/" and "\\"
+// separate.
+#pragma once
 
-#include "core/arch/qvassert.h"
-#include "core/engine/files/qvfileutil.h"
+#include <algorithm>
+#include <string_view>
+
+#include "core/value/anycontainer.h"
 #include "core/value/nametext_p.h"
 
-namespace {
+namespace qvname {
 
-using namespace qvname;
-
-constexpr std::size_t longestOsName = 1023;
+inline constexpr char platformSeparator[] = "/";
+inline constexpr std::size_t longestOsName = 1023;
 
 template <class C>
 std::size_t afterLastSeparator(const Text<C>& name) {
@@ -29,7 +30,7 @@ template <class C>
 Text<C> path(const Text<C>& name) {
     const std::size_t end = afterLastSeparator(name);
     if (end == 0 && name.size() > 1 && name[1] == C(':'))
-        return name.substr(0, 2) + ascii<C>(path_separator());
+        return name.substr(0, 2) + ascii<C>(platformSeparator);
     return name.substr(0, end);
 }
 
@@ -74,7 +75,7 @@ bool unifySeparators(Text<C>& name, C separator) {
 template <class C>
 Text<C> osName(Text<C> name) {
     name.resize(std::min(name.size(), longestOsName));
-    unifySeparators(name, static_cast<C>(*path_separator()));
+    unifySeparators(name, static_cast<C>(*platformSeparator));
     return name;
 }
 
@@ -106,7 +107,7 @@ C separatorOf(const AnyVector& parts) {
         const auto found = std::find_if(part.begin(), part.end(), isSeparator<C>);
         if (found != part.end()) return *found;
     }
-    return static_cast<C>(*path_separator());
+    return static_cast<C>(*platformSeparator);
 }
 
 // The first piece may be empty, and is so for a root: "/" and "a" give "" and "a", joined "/a".
@@ -132,95 +133,10 @@ Text<C> joined(const AnyVector& parts) {
     return out;
 }
 
-bool hasWide(const AnyVector& parts) {
+inline bool hasWide(const AnyVector& parts) {
     for (int i = 0; i < parts.size(); ++i)
         if (parts.at(i).isWString()) return true;
     return false;
 }
 
-}  // namespace
-
-Any QvFile::getPath(const Any& name) {
-    return inWidth(name, [](const auto& text) { return path(text); });
-}
-
-Any QvFile::getFilename(const Any& name) {
-    QV_ASSERT_MSG(name.isText(), "QvFile.getFilename: invalid argument type");
-    return inWidth(name, [](const auto& text) { return filename(text); });
-}
-
-Any QvFile::getBasename(const Any& name) {
-    QV_ASSERT_MSG(name.isText(), "QvFile.getBasename: invalid argument type");
-    return inWidth(name, [](const auto& text) { return basename(text); });
-}
-
-Any QvFile::getExt(const Any& name, bool lower) {
-    QV_ASSERT_MSG(name.isText(), "QvFile.getExt: filename argument must be string");
-    const Any ext = inWidth(name, [](const auto& text) { return extension(text); });
-    if (!lower) return ext;
-    Narrow text = narrow(ext);
-    for (char& c : text)
-        if (c >= 'A' && c <= 'Z') c = static_cast<char>(c - 'A' + 'a');
-    return toAny(text);
-}
-
-Any QvFile::stripExt(const Any& name) {
-    QV_ASSERT_MSG(name.isText(), "QvFile.stripExt: filename argument must be string");
-    return inWidth(name, [](const auto& text) {
-        const std::size_t length = extension(text).size();
-        return length == 0 ? text : text.substr(0, text.size() - length - 1);
-    });
-}
-
-Any QvFile::joinExt(const Any& name, const Any& ext) {
-    QV_ASSERT_MSG(name.isText(), "QvFile.joinExt: filename argument must be string");
-    QV_ASSERT_MSG(ext.isText(), "QvFile.joinExt: extension argument must be string");
-    return inWidth(name, [&ext](const auto& text) {
-        using C = typename std::decay_t<decltype(text)>::value_type;
-        return joinedExt(text, textOf<C>(ext));
-    });
-}
-
-Any QvFile::changeExt(const Any& name, const Any& ext) {
-    const Any file = AnyVector(getBasename(name), ext).join(Any("."));
-    return joinPath(getPath(name), file);
-}
-
-Any QvFile::joinPath(const Any& first, const Any& second) { return joinPath(AnyVector(first, second)); }
-
-Any QvFile::joinPath(const AnyVector& parts) {
-    if (parts.empty()) return Any("");
-    if (parts.size() == 1) return parts.at(0);
-    return hasWide(parts) ? toAny(joined<unsigned short>(parts)) : toAny(joined<char>(parts));
-}
-
-bool QvFile::isAbsolutePath(const Any& name) {
-    QV_ASSERT_MSG(name.isText(), "QvFile.isAbsolutePath: invalid argument type");
-    if (name.isWString()) {
-        QV_ASSERT(name.size() > 0);
-        return isAbsolute(wide(name));
-    }
-    QV_ASSERT(name.size() > 0);
-    return isAbsolute(narrow(name));
-}
-
-void QvFile::winFname(const Any& in, Any& out) { out = osFname(in); }
-
-Any QvFile::osFname(const Any& in) {
-    return inWidth(in, [](const auto& text) { return osName(text); });
-}
-
-bool QvFile::setSeparator(Any& name, char separator) {
-    bool changed = false;
-    const Any unified = inWidth(name, [&](auto text) {
-        using C = typename decltype(text)::value_type;
-        changed = unifySeparators(text, static_cast<C>(separator));
-        return text;
-    });
-    if (changed) name = unified;
-    return changed;
-}
-
-Any QvFile::shellEscape(const Any& text) {
-    return inWidth(text, [](const auto& plain) { return escaped(plain); });
-}
+}  // namespace qvname

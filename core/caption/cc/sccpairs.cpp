@@ -1,10 +1,10 @@
-// Caption data from and to SCC files.
+#include "core/caption/cc/sccpairs_p.h"
+
 #include <algorithm>
 #include <cstdio>
 #include <string>
 
 #include "core/arch/qvassert.h"
-#include "core/caption/cc/qvcc.h"
 #include "core/caption/cc/sccfile_p.h"
 #include "core/engine/files/qvfileutil.h"
 #include "core/engine/log/qvlog.h"
@@ -37,23 +37,10 @@ void reportDamage(const SccFile& scc, const char* name) {
         qv_log()->warning("%s has %d more such places", name, more);
 }
 
-int saveText(const Any& filename, const std::string& text) {
-    const Any name = filename.toString();
-    auto* file = static_cast<std::FILE*>(QvFile::fopen(filename, "wb"));
-    if (!file) {
-        qv_dbg()->error("Can not open %s for writing.", name.asString(""));
-        return QvStatus::failed;
-    }
-    const bool written = std::fwrite(text.data(), 1, text.size(), file) == text.size();
-    if (std::fclose(file) == 0 && written) return QvStatus::ok;
-    qv_dbg()->error("Can not write %s.", name.asString(""));
-    return QvStatus::failed;
-}
-
 }  // namespace
 
-int QvCcData::readScc(const Any& filename, int type, bool detect, QvFramerate& rate, const bool* dropFrame,
-                      bool dropFrameLines) {
+int qvReadScc(const Any& filename, int type, bool detect, QvFramerate& rate, const bool* dropFrame,
+              bool dropFrameLines, std::vector<QvCcBytePair>& pairs) {
     QV_ASSERT(type == QvCcBytePair::field1 || type == QvCcBytePair::field2);
     SccFile scc;
     if (scc.read(filename, dropFrameLines) != QvStatus::ok) return QvStatus::noSegment;
@@ -66,8 +53,8 @@ int QvCcData::readScc(const Any& filename, int type, bool detect, QvFramerate& r
                           rate.rate().ratio(), likely.rate().ratio());
     if (dropFrame) rate.setDf(*dropFrame);
 
-    clear();
-    pairs_.reserve(scc.words.size());
+    pairs.clear();
+    pairs.reserve(scc.words.size());
     auto word = scc.words.begin();
     for (const SccLine& line : scc.lines) {
         const MediaTime time(line.timecode.frameNr(rate, false), rate, MediaTime::defaultTimescale);
@@ -75,16 +62,17 @@ int QvCcData::readScc(const Any& filename, int type, bool detect, QvFramerate& r
         for (std::size_t i = 0; i < line.words; ++i, ++word) {
             pair.byte1 = static_cast<unsigned char>(*word >> 8);
             pair.byte2 = static_cast<unsigned char>(*word);
-            append(pair);
+            pairs.push_back(pair);
         }
     }
     return QvStatus::ok;
 }
 
-std::string QvCcData::sccText(const QvFramerate& rate, const QvSccWriting& options) const {
+std::string qvSccText(std::span<const QvCcBytePair> pairs, const QvFramerate& rate,
+                      const QvSccWriting& options) {
     std::string text = "Scenarist_SCC V1.0\n\n";
-    for (auto pair = pairs_.begin(); pair != pairs_.end();) {
-        auto end = std::find_if(pair, pairs_.end(), [&](const auto& p) { return !(p.time == pair->time); });
+    for (auto pair = pairs.begin(); pair != pairs.end();) {
+        auto end = std::find_if(pair, pairs.end(), [&](const auto& p) { return !(p.time == pair->time); });
         if (options.complete)
             end = std::min(end, pair + std::min(end - pair, longestWrittenLine));
         else
@@ -97,6 +85,15 @@ std::string QvCcData::sccText(const QvFramerate& rate, const QvSccWriting& optio
     return text += "\n";
 }
 
-int QvCcData::writeScc(const Any& filename, const QvFramerate& rate, const QvSccWriting& options) const {
-    return saveText(filename, sccText(rate, options));
+int qvSaveScc(const Any& filename, const std::string& text) {
+    const Any name = filename.toString();
+    auto* file = static_cast<std::FILE*>(QvFile::fopen(filename, "wb"));
+    if (!file) {
+        qv_dbg()->error("Can not open %s for writing.", name.asString(""));
+        return QvStatus::failed;
+    }
+    const bool written = std::fwrite(text.data(), 1, text.size(), file) == text.size();
+    if (std::fclose(file) == 0 && written) return QvStatus::ok;
+    qv_dbg()->error("Can not write %s.", name.asString(""));
+    return QvStatus::failed;
 }

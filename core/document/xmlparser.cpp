@@ -7,9 +7,14 @@
 
 #include "core/arch/qvassert.h"
 #include "core/arch/qvexception.h"
+#include "core/document/generictext_p.h"
+#include "core/document/xmldictionary_p.h"
 #include "core/document/xmldom.h"
 #include "core/document/xmltext_p.h"
+#include "core/document/xmlwriter_p.h"
 #include "core/engine/files/qvfileutil.h"
+#include "core/engine/log/qvlog.h"
+#include "core/engine/threads/qvtimer.h"
 
 namespace {
 
@@ -179,5 +184,47 @@ int XmlParser::parseFile(const Any& path) {
     }
     _watch = nullptr;
     _bytes = watch.bytes;
+    return 0;
+}
+
+int XmlParser::storeXmlTree(const Any& path, XmlNode* root, const char* doctype) {
+    QV_ASSERT(root);
+    qvStoreXml(path, *root, doctype);
+    return 0;
+}
+
+int XmlParser::storeDict(const Any& path, const AnyDict& dict, const char* className, const Any& version) {
+    return qvStoreXmlDict(path, dict, className, version);
+}
+
+int XmlParser::restoreDict(const Any& path, AnyDict& dict, Any& rootName, Any& version) {
+    version = -1;
+    dict.clear();
+    XmlParser parser;
+    QvTimer timer;
+    int result = -1;
+    try {
+        result = parser.parseFile(path);
+    } catch (const QvFileException& failure) {
+        qv_dbg()->error("%s", failure.what());
+    }
+    qv_dbg()->debug("XmlParser.restoreDict: parseFile %f", timer.stop());
+    XmlNode* const root = parser.topLevel();
+    if (!root) return result;
+    if (qvHoldsTooManyObjects(*root, parser._bytes)) {
+        qv_dbg()->error("XmlParser.restoreDict: %s holds too many dictionaries",
+                        path.toString().asString(""));
+        return -1;
+    }
+    rootName = root->name();
+    if (root->getAttr("version").isString()) version = root->getAttr("version");
+    if (root->nrChildren() == 0) {
+        qv_dbg()->error("XmlParser.restoreDict: %s holds no entries", path.toString().asString(""));
+        return -1;
+    }
+
+    timer.start();
+    qvDictOfXml(*root, dict);
+    qv_dbg()->debug("XmlParser.restoreDict: toAny %f", timer.stop());
     return 0;
 }
