@@ -29,13 +29,14 @@ long long allocations = 0;  // the benchmarks run on one thread
 
 }  // namespace
 
-void* operator new(std::size_t size) {
+// Not inlined: GCC takes what it sees of one half for the wrong partner of the other.
+[[gnu::noinline]] void* operator new(std::size_t size) {
     ++allocations;
     if (void* const memory = std::malloc(size ? size : 1)) return memory;
     throw std::bad_alloc();
 }
-void operator delete(void* memory) noexcept { std::free(memory); }
-void operator delete(void* memory, std::size_t) noexcept { std::free(memory); }
+[[gnu::noinline]] void operator delete(void* memory) noexcept { std::free(memory); }
+[[gnu::noinline]] void operator delete(void* memory, std::size_t) noexcept { std::free(memory); }
 
 namespace {
 
