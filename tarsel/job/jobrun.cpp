@@ -55,6 +55,7 @@ class Job::Runner : public QvTranscoder {
         takeFilterFailure();
         last_ = state("closing");
         phase_ = "closing";
+        progress_.show(last_);
         return 0;
     }
 
@@ -367,6 +368,10 @@ void Job::fail(Runner& runner, int result) const {
     take(pipe_.get());
     if (!reason.empty() && (outputs_ || stream_)) throw writeFailure(outputName(), withFinalNames(reason));
     if (runner.filterFailure()) throw *runner.filterFailure();
+    for (const JobStream& s : streams_)
+        if (const TransLink* link = runner.getLinkForOutput(s.type, s.encStream);
+            link && link->errorCode() != 0 && link->outProcessed() == 0 && s.own < s.frame)
+            throw failure(Msg::inputSoundShort, {s.source->name()});
     reason = runner.reason();
     throw failure(Msg::jobFailed, {outputName(), withFinalNames(reason)});
 }

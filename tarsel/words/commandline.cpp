@@ -191,8 +191,10 @@ void Command::flag(const char* names, bool& to, const char* help) {
     take(app_.add_flag(names, to, help), CommandLine::Kind::flag);
 }
 
-void Command::flagOrValue(const char* names, std::string& to, const char* help, const char* type) {
+void Command::flagOrValue(const char* names, std::string& to, const char* help, const char* type,
+                          const std::vector<std::string>& offers) {
     take(app_.add_flag(names, to, help)->type_name(type), CommandLine::Kind::flagOrValue);
+    line_.taken_.back().offers = offers;
 }
 
 void Command::action(std::function<void()> run, std::function<void()> prepare) {
@@ -237,6 +239,7 @@ std::vector<OptionText> CommandLine::describedOptions(const CLI::App& app) const
         for (const Taken& row : taken_)
             if (row.option == option) {
                 text.kind = row.kind;
+                text.required = option->get_required();
                 text.values = row.offers.empty() ? row.values : row.offers;
                 if (row.kind != Kind::flag) text.type = option->get_type_name();
             }
