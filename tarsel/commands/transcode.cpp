@@ -21,6 +21,12 @@ struct Given {
     std::string samplerate, channels, bits, threads;
 };
 
+int parseBits(const std::string& text) {
+    for (const int bits : {8, 16, 24})
+        if (text == std::to_string(bits)) return bits;
+    throw failure(Msg::bitsWrong, {"--bits", text});
+}
+
 void resolve(Given& given) {
     JobOptions& job = given.job;
     job.effects.check();
@@ -34,8 +40,7 @@ void resolve(Given& given) {
         job.samplerate = static_cast<int>(parseNumber(given.samplerate, 1000, 768000, "--samplerate"));
     if (!given.channels.empty())
         job.channels = static_cast<int>(parseNumber(given.channels, 1, 8, "--channels"));
-    if (!given.bits.empty()) job.bits = static_cast<int>(parseNumber(given.bits, 8, 24, "--bits"));
-    if (job.bits && *job.bits % 8 != 0) throw failure(Msg::bitsWrong, {"--bits", given.bits});
+    if (!given.bits.empty()) job.bits = parseBits(given.bits);
     if (!job.muxer.empty() && job.muxer != "nullmux" && job.muxer != "rawmux" && job.muxer != "rawavimux")
         throw failure(Msg::muxerUnknown,
                       {job.muxer, suggestion(job.muxer, {"rawmux", "rawavimux", "nullmux"})});

@@ -103,6 +103,7 @@ class WordCheck {
             take(*row, given ? value : next());
         } else {
             if (given) needValue(*row, value);
+            if (!given) checkApart(*row, word);
             count(*row);
         }
     }
@@ -134,6 +135,13 @@ class WordCheck {
         const bool optional = row.kind == CommandLine::Kind::flagOrValue;
         throw failure(Msg::valueMissing,
                       {name, name + "=" + (optional ? type.substr(2, type.size() - 3) : type)});
+    }
+
+    // "--deinterlace bob" would be read as an input of that name.
+    void checkApart(const CommandLine::Taken& row, const std::string& option) const {
+        const std::string word = at_ + 1 < words_.size() ? words_[at_ + 1] : "";
+        if (std::find(row.offers.begin(), row.offers.end(), word) != row.offers.end())
+            throw failure(Msg::valueApart, {option, word, option + "=" + word});
     }
 
     void count(const CommandLine::Taken& row) {

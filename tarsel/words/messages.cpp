@@ -17,6 +17,7 @@ constexpr Message kMessages[] = {
     {Msg::argumentMissing,  Exit::usage, "{option} is missing",            "the command needs it",                                     "see '{text}'"},
     {Msg::valueMissing,     Exit::usage, "{option}",                       "it needs a value",                                         "give {text}"},
     {Msg::valueNotTaken,    Exit::usage, "{option}",                       "it takes no value, but has {name}",                        "leave out the value"},
+    {Msg::valueApart,       Exit::usage, "{option}",                       "{name} after it is not its value but an argument of the command", "write {text}"},
     {Msg::optionRepeated,   Exit::usage, "{option}",                       "it is given twice, and only one value counts",             "leave one out"},
     {Msg::optionsExclude,   Exit::usage, "{option}",                       "{option} contradicts it",                                  "give one of them"},
     {Msg::choiceUnknown,    Exit::usage, "{option}",                       "{name} is none of its values",                             "{hint}use {text}"},
@@ -150,7 +151,7 @@ constexpr Message kMessages[] = {
     {Msg::captionsLost,    Exit::done,  "{file}",                                "the times of {text} of its subtitles can't be read",           "they are left out"},
     {Msg::captionsLetters, Exit::done,  "captions can't show all letters",       "there are none for {name}",                                    "each became '?'"},
     {Msg::captionsCut,     Exit::done,  "captions hold four rows of 32 letters", "{text} of them are longer",                                    "their ends are left out"},
-    {Msg::captionsLate,    Exit::done,  "captions take a frame for two letters", "{text} of them are too close to the one before",               "they come up to {text} late"},
+    {Msg::captionsLate,    Exit::done,  "captions take a frame for two letters", "there is too little time before {text} of them",               "they come up to {text} late"},
     // subtitles
     {Msg::subtitlesOtherFile,       Exit::input, "--subtitles: can't read {file}",                     "it is no subtitle file",                                "give a .srt or a .sub file of text"},
     {Msg::subtitlesNoText,          Exit::input, "--subtitles: can't read {file}",                     "it is no text",                                         "give a SubRip (.srt) or MicroDVD (.sub) file"},

@@ -17,6 +17,7 @@ enum class Msg : unsigned char {
     argumentMissing,
     valueMissing,
     valueNotTaken,
+    valueApart,
     optionRepeated,
     optionsExclude,
     choiceUnknown,

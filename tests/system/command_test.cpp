@@ -34,6 +34,8 @@ TEST_F(Command, WrongUseIsTold) {
         {4, {"frame", "testgen", "-o", "."}, {"this is a folder", "'./NAME.png'"}},
         {2, {"transcode", "in.wav", "-o", "x.mp4"}, {"'mp4'", ".avi, .png, .wav"}},
         {2, {"transcode", "testgen", "-o", "x.raw", "--size", "x-1"}, {"'x-1' is not a size"}},
+        {2, {"transcode", "in.wav", "-o", "x.wav", "--bits", "32"}, {"--bits: '32'", "8, 16 or 24"}},
+        {2, {"transcode", "--deinterlace", "bob", "testgen", "-o", "x.raw"}, {"'bob'", "--deinterlace=bob"}},
         {2, {"frame", "testgen", "-o", "x.png", "--at", "1", "--sheet", "2x2"}, {"--at", "--sheet"}},
         {5, {"transcode", "in.wav", "--filter", "qqqqqq", "-o", "x.wav"}, {"'qqqqqq'", "tarsel modules"}},
         {2, {"transcode", "testgen:sizee=64x64", "-o", "x.raw"}, {"'sizee'", "did you mean 'size'?"}},
