@@ -415,10 +415,7 @@ void Job::runPost(const std::vector<std::string>& names) const {
                        : noOutput           ? "exec 1>&2\n"
                                             : "exec 2>&1\n");
     const auto report = [] { tell(Level::note, lineOf(Msg::postRuns)); };
-    // What comes while the command starts is answered as well.
-    const Signals::Watch starting(
-        signals_, {.first = [](int) {}, .second = [&] { return files_->leave(); }, .report = report});
-    ShellCommand command(line);
+    ShellCommand command;
     int status = 0;
     {
         const Signals::Watch running(signals_, {.first = [&](int signal) { command.signal(signal); },
@@ -426,6 +423,7 @@ void Job::runPost(const std::vector<std::string>& names) const {
                                                 .report = report,
                                                 .last = Msg::stoppedInPost,
                                                 .file = first});
+        command.start(line);
         // One that came before there was anybody to pass it on.
         if (const int signal = signals_.number()) command.signal(signal);
         status = command.wait();
