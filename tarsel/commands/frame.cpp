@@ -15,6 +15,7 @@
 #include "tarsel/host/outputs/streamoutput.h"
 #include "tarsel/host/plugins.h"
 #include "tarsel/host/signals.h"
+#include "tarsel/host/terminal.h"
 #include "tarsel/picture/picturereader.h"
 #include "tarsel/source/source.h"
 #include "tarsel/words/commandline.h"
@@ -77,14 +78,15 @@ class Reading {
                 static_cast<double>(std::max(1LL, reader.frames()))),
           rate_(source.frameRate().value_or(QvFramerate()).rate()),
           watch_(*given.signals, {.first = {},
-                                  .second = {},
+                                  .second = [this] { return clearLine(), false; },
                                   .report = [this] { progress_.report(state()); },
                                   .suspend = [this] { progress_.time().stopping(); },
-                                  .resume = [this] { progress_.time().continued(); }}) {
+                                  .resume = [this] { progress_.time().continued(); },
+                                  .last = Msg::stopped}) {
         progress_.start();
         reader_.onRead([this](long long number) {
             number_.store(number, std::memory_order_relaxed);
-            if (progress_.due()) progress_.update(state());
+            if (progress_.due() && !ending_) progress_.update(state());
         });
     }
     ~Reading() { reader_.onRead({}); }
@@ -98,6 +100,11 @@ class Reading {
     }
 
   private:
+    // For the end in the middle of it, whoever holds the line.
+    void clearLine() {
+        ending_ = true;
+        if (progress_.onTerminal() && stderrHasRoom()) writeToStderr("\r\x1b[K");
+    }
     ProgressState state() const {
         const long long number = number_.load(std::memory_order_relaxed);
         const double part = static_cast<double>(number) / std::max(last_, 1.0);
@@ -110,6 +117,7 @@ class Reading {
     Progress progress_;
     const double last_, rate_;  // the last frame of the input; frames a second
     std::atomic<long long> number_{-1};
+    std::atomic<bool> ending_{false};
     const Signals::Watch watch_;
 };
 

@@ -32,6 +32,18 @@ TEST_F(Terminal, KeysPauseResumeAndStop) {
     }
 }
 
+TEST_F(Terminal, TheLineGoesWithASignal) {
+    Process run(words({"frame", "testgen:size=64x64,duration=20000,audio=0", "--rate", "50", "--at=-1f", "-o",
+                       "x.png"}),
+                screen);
+    ASSERT_TRUE(run.waitFor("left"));
+    run.signal(SIGTERM);
+    const Outcome o = run.finish();
+    EXPECT_EQ(o.status, 143);
+    EXPECT_THAT(o.out, HasSubstr("\r\x1b[Ktarsel: stopped: a signal ended the command"));
+    EXPECT_THAT(o.out, testing::Not(HasSubstr("keys:"))) << "it has none";
+}
+
 TEST_F(Terminal, OneLineThatGoes) {
     const Outcome o = tarsel({"transcode", "testgen:size=64x64,duration=2", "-o", "out.raw"}, screen);
     EXPECT_EQ(o.status, 0);
