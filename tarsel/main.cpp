@@ -9,6 +9,7 @@
 #include <qvplugcore/qvplugcore.h>
 
 #include "tarsel/commands/commands.h"
+#include "tarsel/commands/progressoption.h"
 #include "tarsel/host/console.h"
 #include "tarsel/host/events.h"
 #include "tarsel/host/files.h"
@@ -94,7 +95,7 @@ int run(int argc, char** argv) {
     addTranscode(line, signals, version);
     addInfo(line);
     addCaptions(line, signals);
-    addFrame(line, signals);
+    addFrame(line, signals, version);
     addModules(line);
     addFormats(line);
     addPresets(line);

@@ -21,6 +21,7 @@
 
 namespace {
 
+constexpr char exactNameKey[] = "exactName";
 constexpr char nameMissing[] = "[rawmux] Output filename not set";
 constexpr int mostStreams = 99;  // their numbers have two digits
 
@@ -44,7 +45,9 @@ constexpr QvParamRow<Settings> settingRows[] = {
      .member = &Settings::filename,
      .help = "of the outputs, without their extensions",
      .type = Any::String},
-    {.name = "exactName", .member = &Settings::exactName, .help = "the one stream goes to filename as it is"},
+    {.name = exactNameKey,
+     .member = &Settings::exactName,
+     .help = "the one stream goes to filename as it is"},
     {"type", {}, qvParamIgnored},
     {"_totalFrames", &Settings::totalFrames},
 };
@@ -89,10 +92,12 @@ void RawMux::store(AnyDict& state) const {
     state.clear();
     state.set("name", name());
     qvStoreParamRows<Settings>(settingRows, settings_, state);
+    if (settings_.exactName) state.set(exactNameKey, 1);
 }
 
 int RawMux::restore(const AnyDict& state) {
     if (!(state.get("name") == name())) return setError(QvStatus::failed, "restore - invalid name");
+    if (state.isSet(exactNameKey)) settings_.exactName = state.get(exactNameKey).isTrue();
     return _restoreRows<Settings>(settingRows, settings_, state);
 }
 

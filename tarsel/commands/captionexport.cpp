@@ -29,11 +29,6 @@ QvFramerate dropFrame() {
     return rate;
 }
 
-bool isSubtitles(const std::string& file) {
-    const Any extension = QvFile::getExt(Any(file.c_str()), true);
-    return extension == "srt" || extension == "sub";
-}
-
 // Without "<i>" and its like.
 std::string withoutTags(const std::string& markup) {
     std::string text;
@@ -72,16 +67,12 @@ void readSubtitles(const std::string& file, Captions& captions) {
     for (int i = 0; i < read.nrSubtitles(); ++i) captions.cues[0].push_back(cueOf(*read.at(i)));
 }
 
-void readScc(const std::vector<std::string>& files, const std::string& rate, Captions& captions) {
-    if (!rate.empty()) captions.rate = parseRate(rate, "--rate");
+void readFields(const std::vector<std::string>& files, const std::optional<QvFramerate>& asked,
+                Captions& captions) {
     for (size_t field = 0; field < files.size(); ++field) {
         requireInput(files[field]);
         QvCcData data;
-        QvFramerate found = captions.rate;
-        if (data.readScc(Any(files[field].c_str()), static_cast<int>(field), rate.empty(), found, nullptr,
-                         true) != QvStatus::ok ||
-            data.count() == 0)
-            refuseScc(files[field]);
+        const QvFramerate found = readScc(files[field], static_cast<int>(field), asked, data);
         if (field == 0 || captions.rate.rate() < found.rate()) captions.rate = found;
         captions.cues[field] = qvCcCues(data.pairs(), static_cast<int>(field));
     }
@@ -129,8 +120,8 @@ void save(const std::string& text, Outputs& outputs, const std::string& extensio
 
 }  // namespace
 
-// The one form that was asked for.
-std::string CaptionExport::only() const {
+// The one form that was asked for, or that the name of the output says.
+std::string CaptionExport::chosen() const {
     const std::pair<bool, const char*> forms[] = {{srt, "srt"}, {vtt, "vtt"}, {scc, "scc"}, {json, "json"}};
     std::string form;
     for (const auto& [asked, name] : forms) {
@@ -138,32 +129,44 @@ std::string CaptionExport::only() const {
         if (!form.empty()) throw failure(Msg::captionsForms, {"--" + form, std::string("--") + name});
         form = name;
     }
+    const bool named = !output.empty() && output != "-";
+    const std::string extension = QvFile::getExt(Any(output.c_str()), true).asString("");
+    if (form.empty() && named)
+        for (const auto& [asked, name] : forms)
+            if (extension == name) form = name;
+    if (form.empty() && named) throw failure(Msg::captionsNoForm, {output});
+    if (form.empty() && isSubtitleFile(files.front())) throw failure(Msg::captionsNotListed, {files.front()});
+    if (form.empty()) return form;
     if (files.size() > 1 && form != "json") throw failure(Msg::captionsOneFile, {"--" + form, files[1]});
     return form;
 }
 
-std::string CaptionExport::text() const {
-    Captions captions;
-    captions.rate = dropFrame();
-    if (isSubtitles(files.front())) {
-        if (!rate.empty()) captions.rate = parseRate(rate, "--rate");
-        readSubtitles(files.front(), captions);
-    } else {
-        readScc(files, rate, captions);
-    }
-    if (srt) return srtText(captions.cues[0]);
-    if (vtt) return vttText(captions.cues[0]);
-    return scc ? sccText(captions) : jsonText(captions);
+std::optional<QvFramerate> CaptionExport::askedRate() const {
+    return rate.empty() ? std::nullopt : std::optional(parseTimecodeRate(rate, "--rate"));
 }
 
-void CaptionExport::run(Signals& signals) const {
-    const std::string form = only();
-    if (output.empty() || output == "-") return printText(text());
+std::string CaptionExport::text(const std::string& form) const {
+    Captions captions;
+    const auto asked = askedRate();
+    captions.rate = asked.value_or(dropFrame());
+    if (isSubtitleFile(files.front()))
+        readSubtitles(files.front(), captions);
+    else
+        readFields(files, asked, captions);
+    return form == "srt"   ? srtText(captions.cues[0])
+           : form == "vtt" ? vttText(captions.cues[0])
+           : form == "scc" ? sccText(captions)
+                           : jsonText(captions);
+}
+
+void CaptionExport::run(const std::string& form, Signals& signals) const {
+    if (output.empty() || output == "-") return printText(text(form));
     if (const auto stream = StreamOutput::find(output, files)) {
-        if (const int error = stream->write(text())) throw systemFailure(Msg::outputSystem, output, error);
+        if (const int error = stream->write(text(form)))
+            throw systemFailure(Msg::outputSystem, output, error);
     } else {
         Outputs file(output, "-o", files, outputs.policy());
-        save(text(), file, form, signals);
+        save(text(form), file, form, signals);
     }
     std::fprintf(stderr, "tarsel: wrote %s\n", inQuotes(output).c_str());
 }

@@ -1,8 +1,11 @@
 // Captions as a file of another form.
 #pragma once
 
+#include <optional>
 #include <string>
 #include <vector>
+
+#include <qvplugcore/qvplugcore.h>
 
 #include "tarsel/commands/outputoptions.h"
 #include "tarsel/host/signals.h"
@@ -10,15 +13,15 @@
 struct CaptionExport {
     std::vector<std::string> files;  // one subtitle file, or SCC files of field 1 and field 2
     bool srt = false, vtt = false, scc = false, json = false;
-    std::string output;  // "": the standard output
-    std::string rate;    // of timecodes; "": what the file suggests, or 29.97 drop frame
+    std::string output;  // "": the standard output; its extension may say the form
+    std::string rate;    // of timecodes; "": what the file suggests, or 29.97df
     OutputOptions outputs;
 
-    bool wanted() const { return srt || vtt || scc || json; }
-    // Throws Failure.
-    void run(Signals& signals) const;
+    // "srt", "vtt", "scc" or "json"; "" for the list of lines. Throws Failure, as the others do.
+    std::string chosen() const;
+    std::optional<QvFramerate> askedRate() const;
+    void run(const std::string& form, Signals& signals) const;
 
   private:
-    std::string text() const;
-    std::string only() const;
+    std::string text(const std::string& form) const;
 };

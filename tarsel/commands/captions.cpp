@@ -59,18 +59,20 @@ std::unique_ptr<QvDecodePipe> openFiles(const std::vector<std::string>& files) {
     refuseScc(files.front());
 }
 
-void showCaptions(const std::vector<std::string>& files) {
+void showCaptions(const std::vector<std::string>& files, const std::optional<QvFramerate>& asked) {
     QvFramerate rate = openFiles(files)->QvCodec::getParam("framerate").asFramerate();
-    printWarnings();
     const bool dropFrame = rate.df();
     QvCcData all;
     for (size_t field = 0; field < files.size(); ++field) {
         QvCcData one;
-        if (one.readScc(Any(files[field].c_str()), static_cast<int>(field), false, rate, &dropFrame, true) !=
-            0)
+        if (asked)
+            rate = readScc(files[field], static_cast<int>(field), asked, one);
+        else if (one.readScc(Any(files[field].c_str()), static_cast<int>(field), false, rate, &dropFrame,
+                             true) != 0)
             throw failure(Msg::readFailed, {files[field]});
         all.extend(one);
     }
+    printWarnings();
     all.sort();
     printLines(all, rate);
 }
@@ -87,8 +89,12 @@ void addCaptions(CommandLine& line, Signals& signals) {
     command.flag("--vtt", given->vtt, "As WebVTT");
     command.flag("--scc", given->scc, "As SCC, captions that pop on");
     command.flag("--json", given->json, "As JSON, one object a caption");
-    command.option("--rate", given->rate, "Frame rate of the timecodes", "R");
-    command.option("-o,--output", given->output, "What to write, in place of the standard output", "FILE");
+    command.option("--rate", given->rate, "Frame rate of the timecodes; 29.97df for drop frame", "R");
+    command.option("-o,--output", given->output,
+                   "What to write, in place of the standard output; its extension may say the form", "FILE");
     given->outputs.add(command);
-    command.action([&signals, given] { given->wanted() ? given->run(signals) : showCaptions(given->files); });
+    command.action([&signals, given] {
+        const std::string form = given->chosen();
+        form.empty() ? showCaptions(given->files, given->askedRate()) : given->run(form, signals);
+    });
 }

@@ -1,7 +1,6 @@
 // The sub-commands. Each adds itself to the command line and says what runs when it is chosen.
 #pragma once
 
-#include <span>
 #include <string>
 
 class CommandLine;
@@ -9,13 +8,10 @@ class Signals;
 
 // `version`: of the tool, for the objects of --progress.
 void addTranscode(CommandLine& line, Signals& signals, const std::string& version);
-// For a command line that can't be read: sends the first object of --progress if the words ask for one, so
-// that the end can be one, too.
-void openEventsFor(std::span<char*> words, const std::string& version);
 void addInfo(CommandLine& line);
 void addCaptions(CommandLine& line, Signals& signals);
 void addModules(CommandLine& line);
 void addFormats(CommandLine& line);
 void addPresets(CommandLine& line);
 void addRecover(CommandLine& line);
-void addFrame(CommandLine& line, Signals& signals);
+void addFrame(CommandLine& line, Signals& signals, const std::string& version);

@@ -1,5 +1,6 @@
 // One picture of a video, or a sheet of many, as a PNG.
 #include <algorithm>
+#include <atomic>
 #include <cerrno>
 #include <cmath>
 #include <cstdio>
@@ -8,12 +9,15 @@
 
 #include "tarsel/commands/commands.h"
 #include "tarsel/commands/outputoptions.h"
+#include "tarsel/commands/progressoption.h"
 #include "tarsel/host/events.h"
+#include "tarsel/host/files.h"
 #include "tarsel/host/memory.h"
 #include "tarsel/host/outputs/outputs.h"
 #include "tarsel/host/outputs/streamoutput.h"
 #include "tarsel/host/plugins.h"
 #include "tarsel/host/signals.h"
+#include "tarsel/host/terminal.h"
 #include "tarsel/picture/picturereader.h"
 #include "tarsel/source/source.h"
 #include "tarsel/words/commandline.h"
@@ -34,6 +38,7 @@ constexpr int kGap = 8;            // pixels between its pictures
 struct Given {
     std::string input, raw, at, output, sheet, threads;
     bool strict = false;
+    ProgressOption progress;
     EffectOptions effects;
     OutputOptions outputOptions;
     std::shared_ptr<Outputs> outputs;  // null where there is a `stream`
@@ -70,6 +75,59 @@ class Shrinker {
     MemoryWatch memory_;
 };
 
+// What is shown while the input is read up to picture `last`.
+class Reading {
+  public:
+    Reading(const Given& given, const Source& source, PictureReader& reader, long long last)
+        : reader_(reader),
+          progress_(given.progress.mode, false, "", false),
+          last_(static_cast<double>(last) * static_cast<double>(source.decoder().nrFrames(0)) /
+                static_cast<double>(std::max(1LL, reader.frames()))),
+          rate_(source.frameRate().value_or(QvFramerate()).rate()),
+          watch_(*given.signals, {.first = {},
+                                  .second = [this] { return clearLine(), false; },
+                                  .report = [this] { progress_.report(state()); },
+                                  .suspend = [this] { progress_.time().stopping(); },
+                                  .resume = [this] { progress_.time().continued(); },
+                                  .last = Msg::stopped}) {
+        progress_.start();
+        reader_.onRead([this](long long number) {
+            number_.store(number, std::memory_order_relaxed);
+            if (progress_.due() && !ending_) progress_.update(state());
+        });
+    }
+    ~Reading() { reader_.onRead({}); }
+    Reading(const Reading&) = delete;
+    Reading& operator=(const Reading&) = delete;
+
+    void done() {
+        ProgressState end = state();
+        end.part = 1;
+        progress_.finish(end);
+    }
+
+  private:
+    // For the end in the middle of it, whoever holds the line.
+    void clearLine() {
+        ending_ = true;
+        if (progress_.onTerminal() && stderrHasRoom()) writeToStderr("\r\x1b[K");
+    }
+    ProgressState state() const {
+        const long long number = number_.load(std::memory_order_relaxed);
+        const double part = static_cast<double>(number) / std::max(last_, 1.0);
+        return {.part = std::min(part, 1.0),
+                .frame = number + 1,
+                .outSeconds = static_cast<double>(number + 1) / rate_};
+    }
+
+    PictureReader& reader_;
+    Progress progress_;
+    const double last_, rate_;  // the last frame of the input; frames a second
+    std::atomic<long long> number_{-1};
+    std::atomic<bool> ending_{false};
+    const Signals::Watch watch_;
+};
+
 void save(const QvFrame& picture, const Given& given) {
     Outputs* const outputs = given.outputs.get();
     Signals::Handlers handlers;
@@ -87,12 +145,13 @@ void save(const QvFrame& picture, const Given& given) {
         throw failure(Msg::warningsCount, {given.output, std::to_string(warnings)});
     if (outputs) outputs->commit();
     given.signals->complete();
-    std::fprintf(stderr, "tarsel: wrote %s\n", inQuotes(given.output).c_str());
+    Events::get().wrote({given.output});
+    tell(Level::note, "wrote " + inQuotes(given.output));
 }
 
 Size parseSheet(const std::string& text) { return parseSize(text, "--sheet", kMostCells, Msg::sheetWrong); }
 
-void saveSheet(PictureReader& reader, const Given& given) {
+void saveSheet(const Source& source, PictureReader& reader, const Given& given) {
     const Size grid = parseSheet(given.sheet);
     const int width = ((kSheetWidth - kGap) / grid.width - kGap) & ~1;
     const int height = std::max(2, static_cast<int>(std::lround(width / reader.format().aspect)) & ~1);
@@ -102,12 +161,15 @@ void saveSheet(PictureReader& reader, const Given& given) {
     Shrinker shrinker(width, height);
     QvFrame cell;
     const int count = grid.width * grid.height;
+    // The middle of each of `count` equal parts of the video.
+    const auto middle = [&](int i) { return (2LL * i + 1) * reader.frames() / (2LL * count); };
+    Reading reading(given, source, reader, middle(count - 1));
     for (int i = 0; i < count; ++i) {
-        // The middle of each of `count` equal parts of the video.
-        shrinker.convert(reader.at((2LL * i + 1) * reader.frames() / (2LL * count)), cell);
+        shrinker.convert(reader.at(middle(i)), cell);
         sheet.clip(cell, 0, 0, kGap + i % grid.width * (width + kGap),
                    kGap + i / grid.width * (height + kGap), width, height);
     }
+    reading.done();
     save(sheet, given);
 }
 
@@ -131,9 +193,11 @@ void frame(Given& given) {
     given.effects.check();
     limitThreads(given.threads);
     if (!given.sheet.empty()) parseSheet(given.sheet);
+    if (!given.sheet.empty() && !given.at.empty()) throw failure(Msg::optionsExclude, {"--at", "--sheet"});
     const OutputPolicy policy = given.outputOptions.policy();
     given.stream = StreamOutput::find(given.output, {given.input});
     const Any extension = QvFile::getExt(Any(given.output.c_str()), true);
+    if (!given.stream) requireNoFolder(given.output, "png");
     if (!given.stream && !(extension == "png")) throw failure(Msg::pictureName, {given.output});
     if (!given.stream && NumberedName::parse(fs::path(given.output).filename().string()))
         throw failure(Msg::pictureNumbered, {given.output});
@@ -144,19 +208,22 @@ void frame(Given& given) {
     given.warnings = checkDamage(source, given.effects.acceptPartial);
     PictureReader reader(source, given.effects);
     if (reader.pipe() && given.outputs) given.outputs->addInputs(filterFiles(*reader.pipe()).read);
-    if (!given.sheet.empty()) return saveSheet(reader, given);
+    if (!given.sheet.empty()) return saveSheet(source, reader, given);
     const auto rate = source.frameRate();
     const MediaTime at =
         given.at.empty() ? MediaTime(0LL, kTicks) : parseInstant(given.at, rate, "--at", lengthOf(source));
     if (rate && at.position(*rate) >= source.decoder().nrFrames(0))
         throw failure(Msg::atAfterEnd, {given.at, given.input, formatTime(source.duration())});
-    const long long number = rate ? at.position(reader.format().rate) : 0;
-    save(reader.at(std::min(number, reader.frames() - 1)), given);
+    const long long number = std::min(rate ? at.position(reader.format().rate) : 0, reader.frames() - 1);
+    Reading reading(given, source, reader, number);
+    const QvFrame& picture = reader.at(number);
+    reading.done();
+    save(picture, given);
 }
 
 }  // namespace
 
-void addFrame(CommandLine& line, Signals& signals) {
+void addFrame(CommandLine& line, Signals& signals, const std::string& version) {
     Command command = line.command("frame", "Save one picture of a video, or a contact sheet");
     auto given = std::make_shared<Given>();
     given->signals = &signals;
@@ -173,5 +240,10 @@ void addFrame(CommandLine& line, Signals& signals) {
     command.flag("--accept-partial", given->effects.acceptPartial,
                  "Take what is there of a damaged input or of damaged subtitles");
     given->outputOptions.add(command);
-    command.action([given] { frame(*given); });
+    given->progress.add(command);
+    command.action([given] { frame(*given); },
+                   [given, version] {
+                       given->progress.open(given->output, {given->input, given->effects.subtitles},
+                                            given->outputOptions.overwrite, version);
+                   });
 }

@@ -27,8 +27,7 @@ void describeText(const AnyDict& p, Json& stream) {
     if (p.get("textEncoding").isText()) stream["encoding"] = text(p.get("textEncoding"));
     if (p.get("count").isInt()) stream["subtitles"] = p.get("count").toInt64();
     if (p.get("framerate").isFramerate() && p.getInt32("format", QvSubtitles::SUB) == QvSubtitles::SUB)
-        stream["timecode"] = formatRate(p.get("framerate").asFramerate()) +
-                             (p.get("framerate").asFramerate().df() ? " drop frame" : "");
+        stream["timecode"] = formatTimecodeRate(p.get("framerate").asFramerate());
     const Any& end = p.isSet("end") ? p.get("end") : p.get("last");
     if (!p.get("first").isMediaTime() || !end.isMediaTime()) return;
     stream["first_s"] = p.get("first").asMediaTime().seconds();

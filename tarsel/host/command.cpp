@@ -38,7 +38,8 @@ struct Fresh {
 
 }  // namespace
 
-ShellCommand::ShellCommand(const std::string& command) {
+void ShellCommand::start(const std::string& command) {
+    const std::lock_guard guard(lock_);
     const Fresh fresh;
     char shell[] = "sh", option[] = "-c";
     char* const arguments[] = {shell, option, const_cast<char*>(command.c_str()), nullptr};
@@ -62,6 +63,7 @@ int ShellCommand::wait() {
 }
 
 void ShellCommand::signal(int number) const {
+    const std::lock_guard guard(lock_);
     if (group_ > 0) ::kill(-group_, number);
 }
 

@@ -88,6 +88,12 @@ std::string firstBytes(const std::string& name, size_t most) {
     return bytes;
 }
 
+void requireNoFolder(const std::string& name, const std::string& extension) {
+    std::error_code error;
+    if (!name.ends_with('/') && !fs::is_directory(name, error)) return;
+    throw failure(Msg::outputNamesFolder, {name, (fs::path(name) / ("NAME." + extension)).string()});
+}
+
 std::string whyNoFolder(const std::string& name) {
     std::error_code error;
     const auto status = fs::status(name, error);

@@ -26,6 +26,10 @@ Failure failureOf(const std::system_error& error);
 // The first bytes of a file, fewer where it ends before. A file that can't be read is refused.
 std::string firstBytes(const std::string& name, size_t most);
 
+// Throws Failure (output) if the name of an output is that of a folder, with the name of a file in it as a
+// hint.
+void requireNoFolder(const std::string& name, const std::string& extension);
+
 // Why `name` is no folder whose entries can be read, in the same words; "" if it is one.
 std::string whyNoFolder(const std::string& name);
 

@@ -89,6 +89,7 @@ OutputKind Job::chosenKind() const {
     if (named) throw failure(Msg::formatUnknown, {options_.format, hint});
     if (options_.output == "-") throw failure(Msg::streamNeedsFormat);
     if (stream_) return OutputKind::byInput;
+    requireNoFolder(options_.output, "avi");
     if (extension.empty()) throw failure(Msg::outputFormatMissing, {options_.output});
     throw failure(Msg::outputFormatUnknown, {options_.output, extension, hint});
 }
@@ -125,6 +126,9 @@ void Job::chooseOutput() {
     if (options_.output.empty()) throw failure(Msg::outputMissing);
     stream_ = StreamOutput::find(options_.output, options_.inputs);
     kind_ = chosenKind();
+    if (const char* writer = kind_ == OutputKind::avi ? "rawavimux" : "rawmux";
+        !options_.muxer.empty() && options_.muxer != writer)
+        throw failure(Msg::muxerOther, {options_.muxer, options_.output, writer});
     choosePixel();
     if (takesOneStream()) checkStream();
     if (stream_) return;
@@ -226,7 +230,9 @@ void Job::checkCounts() const {
 
 void Job::checkPicture() const {
     const bool sound = kind_ == OutputKind::wav || kind_ == OutputKind::nothing;
-    if (!sound && !hasVideo()) throw failure(Msg::inputNoPicture, {options_.output});
+    if (sound || hasVideo()) return;
+    if (options_.noVideo) throw failure(Msg::inputUnwanted, {"--no-video", options_.output});
+    throw failure(Msg::inputNoPicture, {options_.output});
 }
 
 void Job::planStream(Source& source, int type, int number) {

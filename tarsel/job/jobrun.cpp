@@ -55,6 +55,7 @@ class Job::Runner : public QvTranscoder {
         takeFilterFailure();
         last_ = state("closing");
         phase_ = "closing";
+        progress_.show(last_);
         return 0;
     }
 
@@ -367,6 +368,10 @@ void Job::fail(Runner& runner, int result) const {
     take(pipe_.get());
     if (!reason.empty() && (outputs_ || stream_)) throw writeFailure(outputName(), withFinalNames(reason));
     if (runner.filterFailure()) throw *runner.filterFailure();
+    for (const JobStream& s : streams_)
+        if (const TransLink* link = runner.getLinkForOutput(s.type, s.encStream);
+            link && link->errorCode() != 0 && link->outProcessed() == 0 && s.own < s.frame)
+            throw failure(Msg::inputSoundShort, {s.source->name()});
     reason = runner.reason();
     throw failure(Msg::jobFailed, {outputName(), withFinalNames(reason)});
 }
@@ -410,10 +415,7 @@ void Job::runPost(const std::vector<std::string>& names) const {
                        : noOutput           ? "exec 1>&2\n"
                                             : "exec 2>&1\n");
     const auto report = [] { tell(Level::note, lineOf(Msg::postRuns)); };
-    // What comes while the command starts is answered as well.
-    const Signals::Watch starting(
-        signals_, {.first = [](int) {}, .second = [&] { return files_->leave(); }, .report = report});
-    ShellCommand command(line);
+    ShellCommand command;
     int status = 0;
     {
         const Signals::Watch running(signals_, {.first = [&](int signal) { command.signal(signal); },
@@ -421,6 +423,7 @@ void Job::runPost(const std::vector<std::string>& names) const {
                                                 .report = report,
                                                 .last = Msg::stoppedInPost,
                                                 .file = first});
+        command.start(line);
         // One that came before there was anybody to pass it on.
         if (const int signal = signals_.number()) command.signal(signal);
         status = command.wait();

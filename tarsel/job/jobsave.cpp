@@ -15,8 +15,18 @@ void Job::storeTask() {
     if (outputs_) pipe_->setFilename(Any(outputs_->output().c_str()));
     if (stream_) pipe_->setFilename(Any(stream_->engineName().c_str()));
     if (!options_.post.empty()) task.setPostprocessCommand(options_.post.c_str());
+    // Without it a task gives a file the extension of its kind.
+    const std::string stem = QvFile::stripExt(Any(options_.output.c_str())).asString(""),
+                      kinds = stem + "." + primaryExtension();
+    const bool files = outputs_ && !numbered_ && (kind_ == OutputKind::raw || kind_ == OutputKind::wav);
+    const bool differs = files && kinds != options_.output;
+    const bool exact = differs && streams_.size() == 1 && !options_.splitChannels;
+    if (differs && hasVideo() && !exact)
+        warnings_.push_back(lineOf(Msg::taskNamesOther, {options_.saveTask, options_.output, kinds}));
+    if (exact) pipe_->getMuxer()->setParam("exactName", 1);
     AnyDict state;
     task.store(state);
+    if (exact) pipe_->getMuxer()->setParam("exactName", 0);
     // A stream may wait for its reader, which the first signal ends.
     const Signals::Watch storing(signals_, {.first = {}, .second = [&] { return files_->leave(); }});
     // The engine has a name for the standard output, which it writes where it stands.

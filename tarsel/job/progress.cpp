@@ -118,7 +118,8 @@ double RunningTime::seconds() const {
 
 // --- What is shown.
 
-Progress::Progress(const ProgressMode& mode, bool quiet, std::string label) : label_(std::move(label)) {
+Progress::Progress(const ProgressMode& mode, bool quiet, std::string label, bool keys)
+    : label_(std::move(label)), keys_(keys) {
     using How = ProgressMode::How;
     const bool automatic = mode.how == How::automatic && !quiet;
     json_ = mode.how == How::json;
@@ -196,9 +197,12 @@ std::string Progress::line(const ProgressState& state, bool color) const {
 }
 
 void Progress::showLine(const ProgressState& state) {
-    const bool paused = std::string_view(state.state) == "paused";
-    const std::string text =
-        label_ + line(state, color_) + (paused ? "  paused (p resumes, q stops)" : "  keys: p q ?");
+    const std::string_view name = state.state;
+    const char* const more = name == "paused"    ? "  paused (p resumes, q stops)"
+                             : name == "closing" ? "  closing"
+                             : keys_             ? "  keys: p q ?"
+                                                 : "";
+    const std::string text = label_ + line(state, color_) + more;
     std::fprintf(stderr, "\r%s\x1b[K", fitted(text).c_str());
     std::fflush(stderr);
 }

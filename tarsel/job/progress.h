@@ -54,8 +54,8 @@ class RunningTime {
 class Progress {
   public:
     // Automatic: a line when the standard error is a terminal, otherwise a log; `quiet` leaves only objects.
-    // `label` is in front.
-    Progress(const ProgressMode& mode, bool quiet, std::string label);
+    // `label` is in front; `keys`: whether the keys of a terminal work.
+    Progress(const ProgressMode& mode, bool quiet, std::string label, bool keys = true);
     ~Progress();
 
     void start();
@@ -79,7 +79,7 @@ class Progress {
     JobFigures figures(const ProgressState& state) const;
 
     std::string label_;
-    bool line_ = false, json_ = false, log_ = false, color_ = false;
+    bool keys_ = true, line_ = false, json_ = false, log_ = false, color_ = false;
     double interval_ = 0;  // seconds
     std::mutex lock_;      // of what is shown
     bool shown_ = false;

@@ -39,18 +39,27 @@ void EffectOptions::check() const {
     if (!pixel.empty()) parsePixel(pixel, "--pixel");
 }
 
+const std::vector<std::string>& deinterlaceMethods() {
+    static const std::vector<std::string> all = {"top", "bottom", "bob", "double", "reverse"};
+    return all;
+}
+
 void addEffectOptions(Command& command, EffectOptions& options) {
     command.group("Picture");
     command.option("--size", options.size, "Size of the output; 1280x-1 and -1x720 keep the shape", "WxH");
     command.option("--fit", options.fit,
                    "The largest size in a box; bars fills the rest with black, crop cuts what is beyond it",
                    "WxH[,bars|crop]");
-    command.option("--rate", options.rate, "Frames a second: 25, 30000/1001, 25i", "RATE");
-    command.option("--pixel", options.pixel, "Pixel format, see 'tarsel formats'", "FOURCC");
+    command.option("--rate", options.rate, "Frames a second: 25, 30000/1001, 25i, pal, ntsc, film", "RATE",
+                   {"pal", "ntsc", "film", "ntsc-film", "25i", "29.97i"});
+    std::vector<std::string> pixels;
+    for (const QvPixelFormat& format : qvPixelFormats()) pixels.push_back(fourccText(format.fourcc));
+    command.option("--pixel", options.pixel, "Pixel format, see 'tarsel formats'", "FOURCC", pixels);
     command.option("--matrix", options.matrix, "YUV matrix of the output, or of input and output",
-                   "[IN:]601|709");
+                   "[IN:]601|709", {"601", "709", "601:709", "709:601"});
     command.flagOrValue("--deinterlace", options.deinterlace,
-                        "top (unless said), bottom, bob, double or reverse", "[=METHOD]");
+                        "top (unless said), bottom, bob, double or reverse", "[=METHOD]",
+                        deinterlaceMethods());
     command.option("--crop", options.crop, "The part to keep; -X and -Y count from the right and the bottom",
                    "WxH[+X+Y]|W:H");
     command.flag("--flip", options.flip, "Turn the picture upside down");

@@ -21,4 +21,7 @@ struct EffectOptions {
     void check() const;
 };
 
+// The values of --deinterlace.
+const std::vector<std::string>& deinterlaceMethods();
+
 void addEffectOptions(Command& command, EffectOptions& options);

@@ -142,7 +142,7 @@ void PictureEffects::planDeinterlace() {
     if (options_.flip && order && in_.height % 2 == 0) out_.rate.setInterlaced(3 - order);
     if (options_.deinterlace.empty()) return;
     deinterlace_ = options_.deinterlace == "true" ? "top" : options_.deinterlace;
-    const std::vector<std::string> known = {"top", "bottom", "bob", "double", "reverse"};
+    const std::vector<std::string>& known = deinterlaceMethods();
     if (std::find(known.begin(), known.end(), deinterlace_) == known.end())
         throw failure(Msg::nameUnknown, {"--deinterlace", "method", deinterlace_,
                                          suggestion(deinterlace_, known), joined(known)});

@@ -48,6 +48,7 @@ const QvFrame& PictureReader::read(long long frame) {
     QvDecodePipe& decoder = source_.decoder();
     if (decoder.seekToFrame(frame, 0) != QvStatus::ok || decoder.readFrame(0) != QvStatus::ok)
         throw failure(Msg::frameReadFailed, {std::to_string(frame), source_.name()});
+    if (onRead_) onRead_(frame);
     return *decoder.getFramePtr(0);
 }
 

@@ -1,6 +1,7 @@
 // Single pictures of a source, as a run with the same options would write them.
 #pragma once
 
+#include <functional>
 #include <memory>
 
 #include "tarsel/picture/picture.h"
@@ -14,6 +15,8 @@ class PictureReader {
 
     const PictureFormat& format() const { return effects_.out(); }
     long long frames() const { return frames_; }  // that a run would write
+    // Called with the number of each frame of the input that is read, from 0.
+    void onRead(std::function<void(long long)> read) { onRead_ = std::move(read); }
     // Picture `number`, from 0. Valid until the next call. Where a picture depends on those before it, rising
     // numbers cost least.
     const QvFrame& at(long long number);
@@ -32,4 +35,5 @@ class PictureReader {
     std::unique_ptr<QvVProcessPipe> pipe_;
     long long nextInput_ = 0;
     bool holds_ = false;  // the pipe's frame has been handed out
+    std::function<void(long long)> onRead_;
 };

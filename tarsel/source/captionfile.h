@@ -1,7 +1,18 @@
-// What a caption file that is refused holds.
+// Caption files as the tool reads them, and what one that is refused holds.
 #pragma once
 
+#include <optional>
 #include <string>
+
+#include <qvplugcore/qvplugcore.h>
+
+// Reads the SCC file of `field` (0 or 1) into `data`, its times counted at `asked`, or at the rate that the
+// file suggests. Returns the rate; one of drop frame if the file is, and `asked` is of the same speed. Throws
+// Failure (input).
+QvFramerate readScc(const std::string& name, int field, const std::optional<QvFramerate>& asked,
+                    QvCcData& data);
+
+bool isSubtitleFile(const std::string& name);
 
 // Throws Failure (input) for a file that was refused as SCC: it is none, or has no caption lines.
 [[noreturn]] void refuseScc(const std::string& name);

@@ -211,8 +211,12 @@ void Source::openRaw(const std::string& raw) {
     setChecked(d, "height", dimensions.height, option + " size");
     QvFramerate framerate = parseRate(rate ? *rate : "25", option + " rate");
     if (const auto* order = keys.find("interlaced")) {
-        framerate.setInterlaced(static_cast<int>(parseNumber(*order, 0, 2, option + " interlaced")));
-        requireFrames(framerate, rate ? *rate : "25", option + " rate");
+        const int asked = static_cast<int>(parseNumber(*order, 0, 2, option + " interlaced"));
+        const int said = framerate.interlaced();
+        if (said != 0 && said != asked)
+            throw failure(Msg::optionsExclude, {option + " interlaced=" + *order, option + " rate=" + *rate});
+        framerate.setInterlaced(asked);
+        if (said == 0) requireFrames(framerate, rate ? *rate : "25", option + " rate");
     }
     setChecked(d, "framerate", Any(framerate), option + " rate");
     if (const auto* offset = keys.find("offset"))

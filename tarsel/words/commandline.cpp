@@ -103,6 +103,7 @@ class WordCheck {
             take(*row, given ? value : next());
         } else {
             if (given) needValue(*row, value);
+            if (!given) checkApart(*row, word);
             count(*row);
         }
     }
@@ -134,6 +135,13 @@ class WordCheck {
         const bool optional = row.kind == CommandLine::Kind::flagOrValue;
         throw failure(Msg::valueMissing,
                       {name, name + "=" + (optional ? type.substr(2, type.size() - 3) : type)});
+    }
+
+    // "--deinterlace bob" would be read as an input of that name.
+    void checkApart(const CommandLine::Taken& row, const std::string& option) const {
+        const std::string word = at_ + 1 < words_.size() ? words_[at_ + 1] : "";
+        if (std::find(row.offers.begin(), row.offers.end(), word) != row.offers.end())
+            throw failure(Msg::valueApart, {option, word, option + "=" + word});
     }
 
     void count(const CommandLine::Taken& row) {
@@ -191,8 +199,10 @@ void Command::flag(const char* names, bool& to, const char* help) {
     take(app_.add_flag(names, to, help), CommandLine::Kind::flag);
 }
 
-void Command::flagOrValue(const char* names, std::string& to, const char* help, const char* type) {
+void Command::flagOrValue(const char* names, std::string& to, const char* help, const char* type,
+                          const std::vector<std::string>& offers) {
     take(app_.add_flag(names, to, help)->type_name(type), CommandLine::Kind::flagOrValue);
+    line_.taken_.back().offers = offers;
 }
 
 void Command::action(std::function<void()> run, std::function<void()> prepare) {
@@ -237,6 +247,7 @@ std::vector<OptionText> CommandLine::describedOptions(const CLI::App& app) const
         for (const Taken& row : taken_)
             if (row.option == option) {
                 text.kind = row.kind;
+                text.required = option->get_required();
                 text.values = row.offers.empty() ? row.values : row.offers;
                 if (row.kind != Kind::flag) text.type = option->get_type_name();
             }

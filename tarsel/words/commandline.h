@@ -84,7 +84,8 @@ class Command {
     void choice(const char* names, std::string& to, const char* help, const std::vector<std::string>& values);
     void flag(const char* names, bool& to, const char* help);
     // With or without "=VALUE"; "true" without.
-    void flagOrValue(const char* names, std::string& to, const char* help, const char* type);
+    void flagOrValue(const char* names, std::string& to, const char* help, const char* type,
+                     const std::vector<std::string>& offers = {});
     // The heading in the help of the options that follow; "" ends it.
     void group(const char* heading) { group_ = heading; }
 

@@ -14,6 +14,7 @@ struct OptionText {
     std::string heading;              // of its group in the help; empty for the first one
     std::vector<std::string> values;  // the only ones that it takes; empty for any
     Kind kind = Kind::flag;
+    bool required = false;
 
     bool takesValue() const { return kind == Kind::value || kind == Kind::list; }
 };

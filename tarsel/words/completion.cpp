@@ -51,7 +51,8 @@ std::string bashOptions(const std::vector<OptionText>& options) {
             cases += "        " + joined(namesOf(option), "|") + ") " +
                      bashOffer(option.type, option.values) + "; return ;;\n";
         else if (both)
-            cases += "        " + option.longName + ") [[ $equals ]] && { kind=none; return; } ;;\n";
+            cases += "        " + option.longName + ") [[ $equals ]] && { " + bashOffer("", option.values) +
+                     "; return; } ;;\n";
     }
     return "        case $option in\n" + cases +
            "        esac\n        options=" + shellQuoted(joined(all, " ")) + "\n";
@@ -160,7 +161,9 @@ std::string zshOption(const OptionText& option) {
         if (option.kind == OptionText::Kind::flagOrValue) spec += "=-";
         spec += "[" + escaped(option.help) + "]";
         if (option.takesValue()) spec += ":" + zshOffer(option.type, option.values);
-        if (option.kind == OptionText::Kind::flagOrValue) spec += "::" + escaped(option.type) + ": ";
+        if (option.kind == OptionText::Kind::flagOrValue)
+            spec += "::" + (option.values.empty() ? escaped(option.type) + ": "
+                                                  : zshOffer(option.type, option.values));
         lines += " \\\n            " + shellQuoted(spec);
     }
     return lines;
@@ -232,6 +235,8 @@ std::string fishOption(const OptionText& option, const std::string& condition) {
     if (!option.shortName.empty()) line += " -s " + option.shortName.substr(1);
     if (!option.longName.empty()) line += " -l " + option.longName.substr(2);
     if (option.takesValue()) line += fishOffer(option.type, option.values);
+    if (option.kind == OptionText::Kind::flagOrValue)
+        line += " -f" + (option.values.empty() ? "" : " -a " + fishQuoted(joined(option.values, " ")));
     return line + " -d " + fishQuoted(option.help) + "\n";
 }
 

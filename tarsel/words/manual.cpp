@@ -56,8 +56,10 @@ std::string synopsis(const CommandText& command) {
         line += argument.required ? " " + word : " [" + word + "]";
     }
     for (const auto& option : command.options)
-        if (option.longName == "--output" && option.takesValue())
-            line += " " + bold(option.shortName) + " " + slanted(option.type);
+        if (option.longName == "--output" && option.takesValue()) {
+            const std::string output = bold(option.shortName) + " " + slanted(option.type);
+            line += option.required ? " " + output : " [" + output + "]";
+        }
     return line + " [" + slanted("options") + "]\n";
 }
 
@@ -97,9 +99,11 @@ std::string manualOf(const ToolText& tool) {
             bold("--plugins") + " names one.\n.TP\n" + bold("NO_COLOR") +
             "\nNo colours on the terminal if it is set to anything.\n";
     text += ".SH EXAMPLES\n.nf\n";
-    for (const char* line : {"tarsel transcode testgen:size=640x360,duration=4 -o card.avi",
-                             "tarsel transcode card.avi --size 1280x-1 --from=-2 -o end.avi",
-                             "tarsel frame card.avi --at 1.5 -o card.png", "tarsel info card.avi --json"})
+    for (const char* line :
+         {"tarsel transcode testgen:size=640x360,duration=4 -o card.uyvy", "tarsel info card.wav --json",
+          "tarsel transcode card.uyvy card.wav --raw size=640x360,rate=25 --from=-2 -o end.avi",
+          "tarsel frame card.uyvy --raw size=640x360,rate=25 --at 1.5 -o card.png",
+          "tarsel transcode card.wav --samplerate 48000 --bits 24 -o card48.wav"})
         text += roff(line) + "\n";
     return text + ".fi\n";
 }

@@ -5,6 +5,7 @@
 #include <cmath>
 #include <cstdio>
 #include <iterator>
+#include <limits>
 #include <vector>
 
 #include "tarsel/words/messages.h"
@@ -106,6 +107,8 @@ constexpr struct {
     {"film", 24, 1},
     {"ntsc-film", 24000, 1001},
 };
+constexpr double kLeastRate = 0.001, kMostRate = 100000000;
+constexpr std::string_view kDropFrame = "df";
 constexpr int kNtscRates[] = {24, 30, 48, 60, 120};  // times 1000/1001
 
 // 23.976, 23.98 and 29.97 as the exact rates that they stand for.
@@ -120,12 +123,16 @@ std::optional<QvRatio> ratioOf(std::string_view text) {
         if (text == row.name) return QvRatio(row.num, row.den);
     if (const auto parts = split(text, "/"); parts.size() == 2) {
         const auto num = number(parts[0]), den = number(parts[1]);
-        if (!num || !den || *num < 1 || *den < 1 || *num > 100000000 || *den > 1000000) return std::nullopt;
+        constexpr int most = std::numeric_limits<int>::max();
+        if (!num || !den || *num < 1 || *den < 1 || *num > most || *den > most) return std::nullopt;
+        const double value = static_cast<double>(*num) / static_cast<double>(*den);
+        if (!(value >= kLeastRate && value <= kMostRate)) return std::nullopt;
         return QvRatio(static_cast<int>(*num), static_cast<int>(*den));
     }
     double value = 0;
     const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), value);
-    if (error != std::errc() || end != text.data() + text.size() || !(value >= 0.001 && value <= 100000))
+    if (error != std::errc() || end != text.data() + text.size() ||
+        !(value >= kLeastRate && value <= kMostRate))
         return std::nullopt;
     if (const auto ntsc = ntscRate(value)) return ntsc;
     return QvFramerate(value).rate();
@@ -154,31 +161,45 @@ MediaTime parseSpan(std::string_view text, const std::optional<QvFramerate>& rat
     return MediaTime(from.position(*rate) + span.position(*rate), *rate, kTicks);
 }
 
+namespace {
+
+// The rate whose fields an interlaced rate seems to count: no material has more than 30 interlaced frames a
+// second.
+std::optional<QvFramerate> ofFields(const QvFramerate& rate) {
+    if (rate.interlaced() == 0 || rate.rate().den > std::numeric_limits<int>::max() / 2) return std::nullopt;
+    const QvFramerate half(QvRatio(rate.rate().num, rate.rate().den * 2), rate.interlaced());
+    for (const QvFramerate& known : {QvFramerate::f23p(), QvFramerate::f24p(), QvFramerate::f25p(),
+                                     QvFramerate::f29p(), QvFramerate::f30p()})
+        if (half.rate() == known.rate()) return half;
+    return std::nullopt;
+}
+
+}  // namespace
+
 QvFramerate parseRate(std::string_view text, std::string_view option) {
     std::string_view digits = text;
     int interlaced = 0;
+    bool frames = false;
     if (!digits.empty() && (digits.back() == 'i' || digits.back() == 'b' || digits.back() == 'p')) {
         interlaced = digits.back() == 'i' ? 1 : digits.back() == 'b' ? 2 : 0;
         digits.remove_suffix(1);
+        frames = interlaced != 0 && digits.ends_with('f');
+        if (frames) digits.remove_suffix(1);
     }
     const auto ratio = ratioOf(digits);
     if (!ratio) throw failure(Msg::rateWrong, {option, text});
     const QvFramerate rate(*ratio, interlaced);
-    requireFrames(rate, text, option);
+    if (!frames) requireFrames(rate, text, option);
     return rate;
 }
 
-// No material has more than 30 interlaced frames a second.
 void requireFrames(const QvFramerate& rate, std::string_view text, std::string_view option) {
-    if (rate.interlaced() == 0) return;
-    const QvFramerate half(QvRatio(rate.rate().num, rate.rate().den * 2), rate.interlaced());
-    for (const QvFramerate& known : {QvFramerate::f23p(), QvFramerate::f24p(), QvFramerate::f25p(),
-                                     QvFramerate::f29p(), QvFramerate::f30p()})
-        if (half.rate() == known.rate()) throw failure(Msg::rateOfFields, {option, text, formatRate(half)});
+    if (const auto half = ofFields(rate)) throw failure(Msg::rateOfFields, {option, text, formatRate(*half)});
 }
 
 std::string formatRate(const QvFramerate& rate) {
-    const char* const scan = rate.interlaced() == 0 ? "" : rate.isTopFirst() ? "i" : "b";
+    const char* const letter = rate.interlaced() == 0 ? "" : rate.isTopFirst() ? "i" : "b";
+    const std::string scan = std::string(ofFields(rate) ? "f" : "") + letter;
     const QvRatio exact = rate.rate();
     if (exact.den == 1) return std::to_string(exact.num) + scan;
     for (int decimals = 1; decimals <= 3; ++decimals) {
@@ -193,6 +214,18 @@ std::string formatRate(const QvFramerate& rate) {
             return std::string(text, written.ptr) + scan;
     }
     return std::to_string(exact.num) + "/" + std::to_string(exact.den) + scan;
+}
+
+QvFramerate parseTimecodeRate(std::string_view text, std::string_view option) {
+    const bool dropFrame = text.ends_with(kDropFrame);
+    QvFramerate rate = parseRate(dropFrame ? text.substr(0, text.size() - kDropFrame.size()) : text, option);
+    if (dropFrame && !rate.is29p() && !rate.is59p()) throw failure(Msg::rateNoDropFrame, {option, text});
+    rate.setDf(dropFrame);
+    return rate;
+}
+
+std::string formatTimecodeRate(const QvFramerate& rate) {
+    return formatRate(rate) + std::string(rate.df() ? kDropFrame : "");
 }
 
 Size parseSize(std::string_view text, std::string_view option, int most, Msg wrong) {
@@ -210,12 +243,11 @@ Size parseSizeOrShape(std::string_view text, std::string_view option) {
     const auto parts = {text.substr(0, x), x == std::string_view::npos ? "" : text.substr(x + 1)};
     if (std::count(parts.begin(), parts.end(), "-1") != 1)
         return parseSize(text, option, 65535, Msg::sizeOrShapeWrong);
-    std::string whole(text);
     const bool first = *parts.begin() == "-1";
-    whole.replace(first ? 0 : x + 1, 2, "1");
-    Size size = parseSize(whole, option, 65535, Msg::sizeOrShapeWrong);
-    (first ? size.width : size.height) = -1;
-    return size;
+    const auto given = number(first ? *std::next(parts.begin()) : *parts.begin());
+    if (!given || *given < 1 || *given > 65535) throw failure(Msg::sizeOrShapeWrong, {option, text});
+    const int length = static_cast<int>(*given);
+    return first ? Size{-1, length} : Size{length, -1};
 }
 
 long long parseNumber(std::string_view text, long long low, long long high, std::string_view option) {

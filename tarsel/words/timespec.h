@@ -23,12 +23,16 @@ MediaTime parseSpan(std::string_view text, const std::optional<QvFramerate>& rat
 
 // Frames a second: "25", "29.97" and the other NTSC decimals (30000/1001), "30000/1001", "25i" (top field
 // first), "25b" (bottom field first), and the names "pal", "ntsc", "film", "ntsc-film". A rate of fields, as
-// "50i" for 25 frames, is refused with the one of frames.
+// "50i" for 25 frames, is refused with the one of frames; "50fi" says that there are 50 frames.
 QvFramerate parseRate(std::string_view text, std::string_view option);
 // Refuses an interlaced rate that is one of fields; `text` is how the user wrote it.
 void requireFrames(const QvFramerate& rate, std::string_view text, std::string_view option);
 // The shortest text that parseRate reads as this rate and scan: "25", "29.97", "25i", "3000/7".
 std::string formatRate(const QvFramerate& rate);
+
+// The rate of timecodes, which may count in drop frame: "29.97df". Others have no such form.
+QvFramerate parseTimecodeRate(std::string_view text, std::string_view option);
+std::string formatTimecodeRate(const QvFramerate& rate);
 
 struct Size {
     int width;

@@ -44,6 +44,23 @@ TEST_F(Captions, InOtherForms) {
     EXPECT_THAT(works({"captions", "t.srt", "--scc", "--rate", "29.97"}).out,
                 testing::HasSubstr("00:00:01:"));
 
+    // The name says the form, too.
+    works({"captions", "a.scc", "-o", "named.vtt"});
+    EXPECT_EQ(contents("named.vtt"), works({"captions", "a.scc", "--vtt"}).out);
+    fails(2, {"captions", "a.scc", "-o", "named.txt"}, {"'named.txt'", "--srt, --vtt, --scc or --json"});
+    fails(2, {"captions", "t.srt"}, {"'t.srt'", "--srt, --vtt, --scc or --json"});
+
+    // A rate counts, in the list as well; what the file says of drop frame holds.
+    EXPECT_THAT(works({"captions", "a.scc", "--rate", "29.97"}).out,
+                testing::HasSubstr("00:00:03;00\t1\t942c"));
+    const Outcome pal = works({"captions", "a.scc", "--rate", "pal", "--json"});
+    EXPECT_THAT(pal.out, testing::HasSubstr("\"end\":3.0,"));
+    EXPECT_EQ(
+        pal.err,
+        "tarsel: warning: 'a.scc': the numbers of its frames suggest 29.97 a second, not 25; its times may "
+        "be wrong\n");
+    fails(2, {"captions", "a.scc", "--rate", "25df"}, {"'25df'", "drop frame"});
+
     fails(4, {"captions", "t.srt", "--scc", "-o", "t.scc"}, {"'t.scc'", "-y"});
     fails(2, {"captions", "t.srt", "--scc", "--srt"}, {"--scc", "--srt"});
     fails(2, {"captions", "a.scc", "t.scc", "--srt"}, {"'t.scc'"});
@@ -61,7 +78,7 @@ TEST_F(Captions, InfoTellsWhatATextFileHolds) {
         const char* line;
     } rows[] = {
         {"a.scc", "Scenarist_SCC V1.0\n\n00:00:10;00 9420\n00:01:00;02 942f", 0,
-         "CEA-608, 29.97 drop frame, 1801 frames, 2 pairs, 0:00:10.010 to 0:01:00.060\n"},
+         "CEA-608, 29.97df, 1801 frames, 2 pairs, 0:00:10.010 to 0:01:00.060\n"},
         {"a.srt", one + "2\n01:00:00,000 --> 01:00:01,000\n\xC3\xA9\n", 0,
          "SubRip, UTF-8, 2 subtitles, 0:00:01.500 to 1:00:01.000\n"},
         {"c.srt", one + "2\nno times\n\nmore\n", 3,

@@ -128,7 +128,7 @@ TEST_F(Names, OneFileHoldsOneSound) {
 }
 
 TEST_F(Names, RatesArePrintedAsTheyAreTyped) {
-    for (const char* rate : {"25", "25i", "25b", "29.97i", "23.976", "12.5", "100/3"}) {
+    for (const char* rate : {"25", "25i", "25b", "29.97i", "23.976", "12.5", "100/3", "50fi"}) {
         const std::string card = std::string("testgen:size=64x48,duration=1,audio=0,rate=") + rate;
         EXPECT_THAT(works({"info", card}).out, HasSubstr(std::string(" ") + rate + " fps"));
         EXPECT_THAT(works({"transcode", card, "-o", "x.raw", "--dry-run"}).out,
@@ -140,6 +140,8 @@ TEST_F(Names, RatesArePrintedAsTheyAreTyped) {
     makeYuv("a.yuv", 1);
     fails(2, {"transcode", "a.yuv", "--raw", "size=64x48,rate=50,interlaced=1", "-o", "x.raw"},
           {"--raw rate", "'50'", "use 25i"});
+    fails(2, {"transcode", "a.yuv", "--raw", "size=64x48,rate=25i,interlaced=2", "-o", "x.raw"},
+          {"interlaced=2", "rate=25i"});
 }
 
 TEST_F(Names, OfModulesShowTheirParameters) {

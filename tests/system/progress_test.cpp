@@ -146,6 +146,12 @@ TEST_F(Progress, ObjectsAndNothingElse) {
     EXPECT_EQ(done["frame"], 50);
     EXPECT_EQ(done["out_time_us"], 2000000);
     EXPECT_EQ(done["outputs"], json({"again.raw", "again.wav"}));
+    // What is left to do after the last frame has a state of its own.
+    const auto all = objects(works({"transcode", kCard, "-o", "closed.raw", "--progress", "json"}).err);
+    EXPECT_EQ(
+        std::count_if(all.begin(), all.end(),
+                      [](const json& o) { return o.value("state", "") == "closing" && o["frame"] == 50; }),
+        1);
     const json warned =
         last(works({"transcode", kCard, "-o", "w.raw", "--to", "9", "--progress", "json"}).err);
     EXPECT_EQ(warned["warnings"], 1);
@@ -191,6 +197,41 @@ TEST_F(Progress, ADescriptorAFileAndAPipe) {
     o = shell(run + "json:3 3>/dev/full");
     EXPECT_EQ(o.status, 0);
     EXPECT_THAT(o.err, HasSubstr("warning: --progress: objects were lost: descriptor 3: the disk is full"));
+}
+
+// A picture may need all frames before it.
+TEST_F(Progress, OfSinglePicturesAndSheets) {
+    folder.write("there.png", "precious");
+    const struct {
+        int status;
+        Words words;
+    } cases[] = {
+        {0, {kCard, "-o", "shot.png", "--at", "1"}},
+        {0, {kCard, "-o", "sheet.png", "--sheet", "2x2", "--rate", "50"}},
+        {0, {kCard, "-o", "there.png", "-n"}},
+        {3, {"absent.avi", "-o", "x.png"}},
+        {2, {kCard, "-o", "x.png", "--at", "9"}},
+    };
+    for (const auto& c : cases) {
+        const Outcome o = tarsel(Words{"frame"} + c.words + Words{"--progress", "json"});
+        EXPECT_EQ(o.status, c.status) << o.err;
+        const json end = last(o.err);
+        EXPECT_EQ(end["status"], c.status);
+        if (end["state"] != "done") continue;
+        EXPECT_EQ(end["percent"], 100);
+        EXPECT_EQ(end["outputs"], json({c.words[2]}));
+    }
+    Process run(
+        words({"frame", kEndless, "--rate", "50", "--at=-1f", "-o", "x.png", "--progress", "json:events"}),
+        here());
+    while (contents("events").find("\"progress\"") == std::string::npos) sched_yield();
+    run.signal(SIGTERM);
+    EXPECT_EQ(run.finish().status, 143);
+    EXPECT_EQ(last(contents("events"))["state"], "stopped");
+    EXPECT_EQ(size("x.png"), -1);
+    // Other commands are done at once, and say that they have no such option.
+    EXPECT_THAT(last(tarsel({"info", "absent.wav", "--progress", "json"}).err)["error"].get<std::string>(),
+                HasSubstr("--progress"));
 }
 
 TEST_F(Progress, TheEndComesWithASignalToo) {
@@ -244,12 +285,12 @@ TEST_F(Progress, AStopDoesNotCount) {
 
 TEST_F(Progress, ALogHasALineNowAndThen) {
     const std::string slow = "testgen:size=1280x720,rate=25,duration=20000,audio=0";
+    // The same by itself, after ten seconds.
+    Process other(words({"transcode", slow, "-o", "/dev/null", "--format", "raw"}), here());
     Process run(words({"transcode", slow, "-o", "/dev/null", "--format", "raw", "--progress", "log:1"}),
                 here());
     EXPECT_TRUE(run.waitFor("% "));
     EXPECT_TRUE(run.waitFor("% "));
-    // The same by itself, after ten seconds.
-    Process other(words({"transcode", slow, "-o", "/dev/null", "--format", "raw"}), here());
     EXPECT_TRUE(other.waitFor("% "));
     run.signal(SIGTERM);
     other.signal(SIGTERM);
@@ -259,22 +300,6 @@ TEST_F(Progress, ALogHasALineNowAndThen) {
                  "(tarsel: +[0-9.]+ %  frame [0-9]+  [0-9.]+x  left [0-9:]+\n)+"
                  "(tarsel: stopping.*\n)?tarsel: stopped: a signal ended the job; no output was written\n"));
     other.finish();
-}
-
-TEST_F(Progress, KeysOfATerminal) {
-    ProcessOptions screen = here();
-    screen.terminal = true;
-    Process run(words({"transcode", kEndless, "-o", "out.raw"}), screen);
-    ASSERT_TRUE(run.waitFor("keys: p q ?"));
-    run.type("?");
-    ASSERT_TRUE(run.waitFor("p pauses and resumes, q stops the job"));
-    run.type("p");
-    ASSERT_TRUE(run.waitFor("paused (p resumes, q stops)"));
-    run.type("q");
-    const Outcome o = run.finish();
-    EXPECT_EQ(o.status, 130);
-    EXPECT_THAT(o.out, HasSubstr("stopped: a signal ended the job; no output was written"));
-    EXPECT_EQ(listing(), std::set<std::string>());
 }
 
 // Ctrl-Z in a shell with job control: the terminal is the shell's meanwhile, and the keys work again

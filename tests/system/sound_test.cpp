@@ -48,6 +48,24 @@ TEST_F(Sound, PointsAreSamples) {
     }
 }
 
+// Next to a picture a sound that ends early is followed by silence, but one that ends within the first frame
+// is refused.
+TEST_F(Sound, ShorterThanThePicture) {
+    makeYuv("clip.yuv", 25);
+    const std::string half = wavPart(contents(makeWav("half.wav", 22050)), "data");
+    works(asYuv({"transcode", "clip.yuv", "half.wav", "-o", "long.yuv"}));
+    EXPECT_TRUE(wavPart(contents("long.wav"), "data") == half + std::string(22050 * 4, '\0'));
+    for (const unsigned samples : {0u, 1u, 1763u}) {
+        makeWav("short.wav", samples);
+        for (const Words& more : {Words{"-o", "x.avi"}, {"-o", "x.yuv", "--samplerate", "48000"}})
+            fails(3, asYuv({"transcode", "clip.yuv", "short.wav"}) + more,
+                  {"the sound of 'short.wav'", "the first frame of the picture", "--no-audio"});
+    }
+    works(asYuv({"transcode", "clip.yuv", "short.wav", "-o", "mute.avi", "--no-audio"}));
+    makeWav("short.wav", 1764);
+    works(asYuv({"transcode", "clip.yuv", "short.wav", "-o", "enough.yuv"}));
+}
+
 // An unknown length, as a recorder leaves it, is taken for what it is; any other one that lies is not.
 TEST_F(Sound, LengthsThatLie) {
     const std::string data = patternBytes(4000);

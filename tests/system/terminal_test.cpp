@@ -11,20 +11,37 @@ class Terminal : public Tool {
     ProcessOptions screen = here();
 };
 
-TEST_F(Terminal, PausesResumesAndStops) {
-    Process run(words({"transcode", "testgen:size=64x64,duration=20000,audio=0", "-o", "out.raw"}), screen);
-    ASSERT_TRUE(run.waitFor("frame"));
-    run.type("p");
-    ASSERT_TRUE(run.waitFor("paused"));
-    run.type("p");
-    ASSERT_TRUE(run.waitFor("frame"));
-    run.type("p");
-    ASSERT_TRUE(run.waitFor("paused"));
-    run.type("\x03");
+TEST_F(Terminal, KeysPauseResumeAndStop) {
+    for (const char* stop : {"q", "\x03"}) {
+        Process run(words({"transcode", "testgen:size=64x64,duration=20000,audio=0", "-o", "out.raw"}),
+                    screen);
+        ASSERT_TRUE(run.waitFor("keys: p q ?"));
+        run.type("?");
+        ASSERT_TRUE(run.waitFor("p pauses and resumes, q stops the job"));
+        run.type("p");
+        ASSERT_TRUE(run.waitFor("paused (p resumes, q stops)"));
+        run.type("p");
+        ASSERT_TRUE(run.waitFor("keys: p q ?"));
+        run.type("p");
+        ASSERT_TRUE(run.waitFor("paused"));
+        run.type(stop);
+        const Outcome o = run.finish();
+        EXPECT_EQ(o.status, 130);
+        EXPECT_THAT(o.out, HasSubstr("stopped: a signal ended the job; no output was written"));
+        EXPECT_EQ(listing(), std::set<std::string>());
+    }
+}
+
+TEST_F(Terminal, TheLineGoesWithASignal) {
+    Process run(words({"frame", "testgen:size=64x64,duration=20000,audio=0", "--rate", "50", "--at=-1f", "-o",
+                       "x.png"}),
+                screen);
+    ASSERT_TRUE(run.waitFor("left"));
+    run.signal(SIGTERM);
     const Outcome o = run.finish();
-    EXPECT_EQ(o.status, 130);
-    EXPECT_THAT(o.out, HasSubstr("stopped: a signal ended the job; no output was written"));
-    EXPECT_EQ(listing(), std::set<std::string>());
+    EXPECT_EQ(o.status, 143);
+    EXPECT_THAT(o.out, HasSubstr("\r\x1b[Ktarsel: stopped: a signal ended the command"));
+    EXPECT_THAT(o.out, testing::Not(HasSubstr("keys:"))) << "it has none";
 }
 
 TEST_F(Terminal, OneLineThatGoes) {

@@ -7,6 +7,7 @@
 #include <algorithm>
 #include <cstring>
 #include <filesystem>
+#include <initializer_list>
 #include <set>
 #include <string>
 #include <vector>
@@ -83,6 +84,29 @@ class Tool : public testing::Test {
     }
     static Words asYuv(const Words& arguments) {
         return arguments + Words{"--raw", "size=64x48,pixel=I420,rate=25"};
+    }
+
+    // Each of these parts of "clip.yuv" is taken as it is there.
+    struct Part {
+        Words points;
+        size_t first, count;  // frames
+    };
+    void takesParts(std::initializer_list<Part> parts) const {
+        const std::string clip = contents("clip.yuv");
+        for (const Part& part : parts) {
+            SCOPED_TRACE(testing::PrintToString(part.points));
+            const Outcome o = works(asYuv({"transcode", "clip.yuv", "-o", "part.yuv", "-y"}) + part.points);
+            EXPECT_TRUE(clip.substr(part.first * kFrame, part.count * kFrame) == contents("part.yuv"));
+            EXPECT_THAT(o.err, testing::HasSubstr(", " + std::to_string(part.count) + " frame"));
+        }
+    }
+
+    // The job with each of these options is wrong use.
+    struct Refusal {
+        Words options, parts;
+    };
+    void refuses(const Words& job, std::initializer_list<Refusal> rows) const {
+        for (const Refusal& row : rows) fails(2, job + row.options, row.parts);
     }
 
     TempFolder folder;

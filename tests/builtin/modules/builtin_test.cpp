@@ -1,5 +1,6 @@
 #include <gmock/gmock.h>
 
+#include <iterator>
 #include <memory>
 #include <set>
 
@@ -27,8 +28,9 @@ TEST_F(Builtin, ModulesStandInTheirOrder) {
         "aumixdec",   "mvprocess", "mvmetadec", "memmux",   "memsink",    "sccdec",       "videofade",
         "audiolevel", "panning",
     };
-    ASSERT_EQ(registry.nrModules(0), 44);
-    for (int i = 0; i < 44; ++i) EXPECT_STREQ(registry.module(i)->name(), names[i]);
+    const int count = static_cast<int>(std::size(names));
+    ASSERT_EQ(registry.nrModules(0), count);
+    for (int i = 0; i < count; ++i) EXPECT_STREQ(registry.module(i)->name(), names[i]);
 }
 
 TEST_F(Builtin, ARestoredValueThatIsRefusedIsNamed) {

@@ -161,6 +161,15 @@ TEST_F(RawMuxing, AnExactName) {
         EXPECT_EQ(read("out.x").substr(80), sound);
         EXPECT_EQ(written(), Texts{"out.x"});
     }
+    // It is stored where it is set, so that a task keeps the name.
+    AnyDict named, plain;
+    pipe_->getMuxer()->store(named);
+    EXPECT_TRUE(named.get("exactName").isTrue());
+    pipe_->setParam("muxer/exactName", 0);
+    pipe_->getMuxer()->store(plain);
+    EXPECT_FALSE(plain.isSet("exactName"));
+    EXPECT_EQ(pipe_->getMuxer()->restore(named), 0);
+    EXPECT_TRUE(pipe_->getMuxer()->QvCodec::getParam("exactName").isTrue());
 }
 
 struct CountingTranscoder : QvTranscoder {

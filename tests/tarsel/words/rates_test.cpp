@@ -34,6 +34,10 @@ TEST(Rates, AreReadExactlyAndWhatIsPrintedCanBeTyped) {
         {"120", 120, 1, 0, "120"},
         {"50", 50, 1, 0, "50"},
         {"40i", 40, 1, 1, "40i"},
+        {"50fi", 50, 1, 1, "50fi"},
+        {"59.94fb", 60000, 1001, 2, "59.94fb"},
+        {"25fi", 25, 1, 1, "25i"},
+        {"1000000000/41708333", 1000000000, 41708333, 0, "1000000000/41708333"},
         {"pal", 25, 1, 0, "25"},
         {"ntsc", 30000, 1001, 0, "29.97"},
         {"film", 24, 1, 0, "24"},
@@ -50,6 +54,31 @@ TEST(Rates, AreReadExactlyAndWhatIsPrintedCanBeTyped) {
     }
 }
 
+// Whatever a plug-in says, and all of the named rates.
+TEST(Rates, ThatAreNoUsersAreReadAgain) {
+    std::vector<QvFramerate> rates = {QvFramerate::f23p(), QvFramerate::f24p(), QvFramerate::f25p(),
+                                      QvFramerate::f29p(), QvFramerate::f30p(), QvFramerate::f50p(),
+                                      QvFramerate::f59p(), QvFramerate::f60p(), QvFramerate::f50i(),
+                                      QvFramerate::f59i(), QvFramerate::f60i()};
+    for (const int num : {1, 47, 48, 50, 60, 999, 90000, 2147483647})
+        for (const int den : {1, 2, 1001, 417083, 2147483647})
+            if (1000.0 * num >= den && num / den <= 100000000) rates.emplace_back(QvRatio(num, den));
+    for (const QvFramerate& rate : rates)
+        for (const int interlaced : {rate.interlaced(), 1, 2}) {
+            QvFramerate one = rate;
+            one.setInterlaced(interlaced);
+            const std::string text = formatRate(one);
+            const QvFramerate again = parseRate(text, "--rate");
+            EXPECT_EQ(again.rate().num, one.rate().num) << text;
+            EXPECT_EQ(again.rate().den, one.rate().den) << text;
+            EXPECT_EQ(again.interlaced(), interlaced) << text;
+        }
+    for (const char* text : {"29.97df", "59.94df", "29.97", "25"})
+        EXPECT_EQ(formatTimecodeRate(parseTimecodeRate(text, "--rate")), text);
+    for (const char* text : {"25df", "df", "23.976df"})
+        EXPECT_THROW(parseTimecodeRate(text, "--rate"), Failure);
+}
+
 TEST(Rates, OfFieldsAreRefusedWithThoseOfFrames) {
     const struct {
         const char *typed, *hint;
@@ -61,6 +90,8 @@ TEST(Rates, OfFieldsAreRefusedWithThoseOfFrames) {
         {"60i", "use 30i"},
         {"48i", "use 24i"},
         {"47.952i", "use 23.976i"},
+        {"25f", "25i"},
+        {"fi", "25i"},
         // These are no rates at all.
         {"", "25i"},
         {"i", "pal"},

@@ -352,8 +352,10 @@ int TransALink::endStep(int result) {
 }
 
 int TransALink::readFailed() {
-    return setError(QvStatus::failed,
-                    Any::sprintf("ALink @ %p: Audio error, can not read samples", static_cast<void*>(this)));
+    constexpr const char* reason = "Audio error, can not read samples";
+    qv_dbg()->log(QvLogMask::error, "ALink @ %p: %s", static_cast<void*>(this), reason);
+    copyError(QvStatus::failed, reason);
+    return QvStatus::failed;
 }
 
 void TransALink::logDone(const char* what) const {

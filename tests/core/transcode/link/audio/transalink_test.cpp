@@ -94,6 +94,7 @@ TEST(TransALink, FailuresComeOut) {
             EXPECT_EQ(job.link.errorCode(), row.open + row.step);
         }
         EXPECT_NE(std::string(job.link.errorDesc()).find(row.text), std::string::npos);
+        EXPECT_EQ(std::string(job.link.errorDesc()).find("0x"), std::string::npos) << "an address";
     }
 }
 
