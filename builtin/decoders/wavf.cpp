@@ -161,8 +161,11 @@ bool HeaderReader::readFormat(long long position, std::uint32_t size) {
     if (numbers_.u16(bytes + 16) != extensionBytes) return true;
     formatFieldsEnd_ = position + static_cast<long long>(sizeof bytes);
     if (header_.formatTag == extensibleTag) header_.channelMask = numbers_.u32(bytes + 20);
-    // The first field of the GUID has 32 bits.
-    subFormat_ = static_cast<int>(numbers_.u16(bytes + (header_.bigEndian ? 26 : 24)));
+    subFormat_ = static_cast<int>(numbers_.u16(bytes + 24));
+    // The GUID begins with a number of 32 bits. Some writers of big-endian files take it for one of 16, or
+    // leave it little-endian.
+    if (header_.bigEndian && subFormat_ == 0) subFormat_ = static_cast<int>(numbers_.u16(bytes + 26));
+    if (header_.bigEndian && (subFormat_ & 0xFF) == 0) subFormat_ >>= 8;
     return true;
 }
 

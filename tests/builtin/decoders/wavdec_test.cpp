@@ -199,7 +199,8 @@ std::string wavOf(const std::string& format, const std::string& data) {
 }
 
 // The same file with every number turned around, for those whose chunks are "fmt " and "data".
-std::string bigEndian(std::string file, std::size_t width) {
+// `guid`: so many bytes of the sub-format are turned; some writers turn fewer than four.
+std::string bigEndian(std::string file, std::size_t width, std::size_t guid = 4) {
     const auto turn = [&](std::size_t at, std::size_t bytes) {
         const auto begin = file.begin() + static_cast<std::ptrdiff_t>(at);
         std::reverse(begin, begin + static_cast<std::ptrdiff_t>(bytes));
@@ -213,7 +214,7 @@ std::string bigEndian(std::string file, std::size_t width) {
     if (formatBytes == 40) {
         for (const std::size_t at : {36, 38, 46, 48, 50}) turn(at, 2);
         turn(40, 4);
-        turn(44, 4);  // the first field of the GUID has 32 bits
+        turn(44, guid);
     }
     for (std::size_t at = data + 8; at + width <= end; at += width) turn(at, width);
     return file;
@@ -249,7 +250,9 @@ TEST_F(Wav, ExtendedReadsOtherValues) {
             const auto format =
                 extensible ? wavExtensible(c.tag, 1, 8000, c.bits, 4) : wavFormat(c.tag, 1, 8000, c.bits);
             const std::string plain = wavOf(format, c.stored), turned = bigEndian(plain, (c.bits + 7) / 8);
-            for (const std::string& file : {plain, turned})
+            const std::string half = bigEndian(plain, (c.bits + 7) / 8, 2);
+            const std::string left = bigEndian(plain, (c.bits + 7) / 8, 0);
+            for (const std::string& file : {plain, turned, half, left})
                 for (const int block : {1, 7, 4096}) {
                     decoder.setParam("extended", 0);
                     EXPECT_EQ(open(file), -15) << c.what;
