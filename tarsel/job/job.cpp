@@ -7,6 +7,7 @@
 #include <set>
 
 #include "tarsel/host/files.h"
+#include "tarsel/source/wavcarry.h"
 #include "tarsel/words/messages.h"
 #include "tarsel/words/rawnames.h"
 #include "tarsel/words/timespec.h"
@@ -389,7 +390,28 @@ void Job::addStream(JobStream& stream) {
             pipe_->getMuxer()
                 ->stream(kAudio, stream.encStream)
                 ->setParam("expectedSamples", Any(stream.expected));
+        carryChunks(stream);
     }
+}
+
+// Only a WAV file has room for them. A stream ends with its samples.
+void Job::carryChunks(const JobStream& stream) {
+    if (writesNothing()) return;
+    QvBufStream* output =
+        kind_ == OutputKind::avi ? nullptr : pipe_->getMuxer()->stream(kAudio, stream.encStream);
+    if (output) output->setParam("rf64", 1);
+    WavPart part = {.samplerate = stream.samplerate,
+                    .channels = stream.channels,
+                    .bits = stream.bits,
+                    .changed = stream.params.filters().has_value()};
+    if (takesPart()) {
+        const int rate = intParam(stream.source->decoder(), kAudio, stream.decStream, "samplerate");
+        part.first = stream.in.position(rate);
+        part.samples = stream.out.position(rate) - part.first;
+    }
+    const std::string lost =
+        carryWavChunks(*stream.source, stream.decStream, part, takesOneStream() ? nullptr : output);
+    if (!lost.empty()) warnings_.push_back(lineOf(Msg::inputChunksLost, {stream.source->name(), lost}));
 }
 
 // Nothing is written over what the job reads, or twice, and names that exist are refused before any work;

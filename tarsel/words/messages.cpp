@@ -72,6 +72,8 @@ constexpr Message kMessages[] = {
     {Msg::inputEndedEarly,   Exit::input, "{file} ended early",                     "{text} of {text} {text} were read",                     "--accept-partial keeps what is there"},
     {Msg::inputDamagedTaken, Exit::done,  "{file} is damaged",                      "{text}",                                                "the part that can be read is used"},
     {Msg::inputPartlyRead,   Exit::done,  "{file} ended early",                     "{text} of {text} {text} were read",                     "the output holds these"},
+    {Msg::inputClipped,      Exit::done,  "{file} goes beyond full scale",          "{text} samples of audio stream {text} were clipped",    "lower its level where it is made"},
+    {Msg::inputChunksLost,   Exit::done,  "{file}",                                 "the output can't keep {text} of it",                    ""},
     {Msg::readFailed,        Exit::input, "can't read {file}",                      "its data has changed or can't be reached",              "check the file and its disk"},
     {Msg::frameReadFailed,   Exit::input, "can't read frame {text} of {file}",      "its data has changed or can't be reached",              "check the file and its disk"},
     {Msg::inputNoPicture,    Exit::input, "no input has a picture for {file}",      "there is nothing but sound",                            "write sound alone as WAV: a name in .wav, or --format wav"},

@@ -72,6 +72,8 @@ enum class Msg : unsigned char {
     inputEndedEarly,
     inputDamagedTaken,
     inputPartlyRead,
+    inputClipped,
+    inputChunksLost,
     readFailed,
     frameReadFailed,
     inputNoPicture,
