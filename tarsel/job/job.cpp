@@ -394,11 +394,12 @@ void Job::addStream(JobStream& stream) {
     }
 }
 
-// Only a WAV file has room for them. A stream ends with its samples.
+// Only a WAV file has room for them. A stream ends with its samples, and not every reader of a pipe knows
+// RF64.
 void Job::carryChunks(const JobStream& stream) {
     if (writesNothing()) return;
-    QvBufStream* output =
-        kind_ == OutputKind::avi ? nullptr : pipe_->getMuxer()->stream(kAudio, stream.encStream);
+    const bool isFile = kind_ != OutputKind::avi && !takesOneStream();
+    QvBufStream* output = isFile ? pipe_->getMuxer()->stream(kAudio, stream.encStream) : nullptr;
     if (output) output->setParam("rf64", 1);
     WavPart part = {.samplerate = stream.samplerate,
                     .channels = stream.channels,
@@ -409,8 +410,7 @@ void Job::carryChunks(const JobStream& stream) {
         part.first = stream.in.position(rate);
         part.samples = stream.out.position(rate) - part.first;
     }
-    const std::string lost =
-        carryWavChunks(*stream.source, stream.decStream, part, takesOneStream() ? nullptr : output);
+    const std::string lost = carryWavChunks(*stream.source, stream.decStream, part, output);
     if (!lost.empty()) warnings_.push_back(lineOf(Msg::inputChunksLost, {stream.source->name(), lost}));
 }
 
