@@ -3,6 +3,7 @@
 
 #include "builtin/decoders/wavdec.h"
 #include "core/media/qvbuffer.h"
+#include "core/split/wavchunks.h"
 #include "tests/fuzz/fuzz.h"
 
 namespace {
@@ -32,6 +33,11 @@ void checkChunks(const WavDec& decoder, std::size_t fileSize) {
     for (const Any& chunk : chunks.asVector())
         bytes += static_cast<std::size_t>(chunk.asDict().get("data").size());
     require(bytes <= fileSize);
+    QvWavChunks::describe(chunks.asVector());
+    for (const long long first : {0LL, 1000LL, 1LL << 62}) {
+        const QvWavChunks::Part part = {first, 48000, 44100, 48000, 24, first == 0};
+        require(QvWavChunks::ofPart(chunks.asVector(), part).size() <= chunks.asVector().size());
+    }
 }
 
 }  // namespace
