@@ -12,7 +12,7 @@
 namespace {
 
 constexpr int extensibleTag = 65534;
-constexpr int maxChunksBeforeFormat = 100000;
+constexpr int maxChunks = 100000;
 // Ids and text after the format are searched for "data" at this many places, the first of them three bytes
 // before the end of the format's fields.
 constexpr int dataTries = 100000;
@@ -129,9 +129,10 @@ WavStatus HeaderReader::findFormat() {
     std::memcpy(form_.data(), bytes + 8, 4);
 
     long long position = 12;
-    for (int i = 0; i < maxChunksBeforeFormat; ++i) {
+    for (int i = 0; i < maxChunks; ++i) {
         Chunk chunk;
-        if (!chunkAt(position, chunk) || static_cast<std::int32_t>(chunk.size) < 1) break;
+        const int smallest = extended_ ? 0 : 1;
+        if (!chunkAt(position, chunk) || static_cast<std::int32_t>(chunk.size) < smallest) break;
         if (chunk.id == "fmt ") {
             formatEnd_ = behindChunk(position, chunk);
             return readFormat(position + 8, chunk.size) ? WavStatus::ok : WavStatus::cannotParse;
@@ -181,11 +182,13 @@ bool HeaderReader::takeDataAt(long long position) {
 bool HeaderReader::findData() { return findDataByChunks() || findDataBySearch(); }
 
 bool HeaderReader::findDataByChunks() {
-    const long long last = formatFieldsEnd_ - 3 + dataTries - 1;
+    const long long last = extended_ ? file_.length() : formatFieldsEnd_ - 3 + dataTries - 1;
+    long long position = formatEnd_;
     Chunk chunk;
-    for (long long position = formatEnd_; position <= last && chunkAt(position, chunk);
-         position = behindChunk(position, chunk))
+    for (int i = 0; i < maxChunks && position <= last && chunkAt(position, chunk); ++i) {
         if (chunk.id == "data") return takeDataAt(position);
+        position = behindChunk(position, chunk);
+    }
     return false;
 }
 
@@ -236,8 +239,7 @@ WavStatus HeaderReader::checkFormat() {
 // Whole chunks from here to the end of the file: then an empty "data" chunk is meant as it stands.
 bool HeaderReader::chunksFillTheRest(long long position) {
     Chunk chunk;
-    for (int i = 0; i < maxChunksBeforeFormat && chunkAt(position, chunk); ++i)
-        position = behindChunk(position, chunk);
+    for (int i = 0; i < maxChunks && chunkAt(position, chunk); ++i) position = behindChunk(position, chunk);
     return position == file_.length();
 }
 

@@ -11,7 +11,8 @@
 // beyond the end is cut to what is there.
 //
 // Plain files have PCM of 8, 16 or 24 bits, up to 8 channels, and "RIFF". The extended reading also takes
-// other codings and widths, more channels, 64-bit sizes, and "RIFX", where all numbers are big-endian.
+// other codings and widths, more channels, 64-bit sizes, and "RIFX", where all numbers are big-endian. "data"
+// may be as far away as the chunks before it take, and chunks before "fmt " may be empty.
 #pragma once
 
 #include <string>

@@ -60,25 +60,28 @@ HWY_INLINE void store24(unsigned char* to, hn::VFromD<decltype(ints4)> values) {
     hn::StoreU(hn::TableLookupBytes(hn::BitCast(bytes16, values), hn::Load(bytes16, places)), bytes16, to);
 }
 
-// Scaled and bounded; `inside` becomes the mask of those that were not beyond full scale.
 template <class D>
-HWY_INLINE hn::VFromD<D> scaled(D tag, hn::VFromD<D> value, hn::MFromD<D>& inside) {
+HWY_INLINE hn::VFromD<D> scaled(D tag, hn::VFromD<D> value) {
     using Float = hn::TFromD<D>;
-    inside = hn::Le(hn::Abs(value), hn::Set(tag, Float{1}));
     const auto number = hn::IfThenElseZero(hn::Eq(value, value), value);
     const auto wide = hn::Mul(number, hn::Set(tag, static_cast<Float>(1 << 23)));
     return hn::Min(hn::Max(wide, hn::Set(tag, static_cast<Float>(low24))),
                    hn::Set(tag, static_cast<Float>(high24)));
 }
 
-// Two values as integers; adds the mask of those beyond full scale to `outside`.
+// -1 for each value beyond full scale.
+template <class D, class Count>
+HWY_INLINE hn::VFromD<Count> beyond(D tag, hn::VFromD<D> value, Count counts) {
+    const auto inside = hn::Le(hn::Abs(value), hn::Set(tag, hn::TFromD<D>{1}));
+    return hn::BitCast(counts, hn::VecFromMask(tag, hn::Not(inside)));
+}
+
+// Two values as integers; those beyond full scale are counted in `outside`.
 HWY_INLINE hn::VFromD<decltype(ints2)> pair(const unsigned char* from,
                                             hn::VFromD<decltype(longs2)>& outside) {
     const auto value = hn::BitCast(doubles2, hn::LoadU(bytes16, from));
-    hn::MFromD<decltype(doubles2)> inside;
-    const auto bounded = hn::Round(scaled(doubles2, value, inside));
-    outside = hn::Add(outside, hn::BitCast(longs2, hn::VecFromMask(doubles2, hn::Not(inside))));
-    return hn::DemoteTo(ints2, bounded);
+    outside = hn::Add(outside, beyond(doubles2, value, longs2));
+    return hn::DemoteTo(ints2, hn::Round(scaled(doubles2, value)));
 }
 #endif
 
@@ -105,12 +108,11 @@ size_t narrowFloat32(unsigned char* HWY_RESTRICT to, const unsigned char* HWY_RE
 #if HWY_TARGET != HWY_SCALAR
     auto outside = hn::Zero(ints4);
     for (; i + room <= count; i += step) {
-        hn::MFromD<decltype(floats4)> inside;
         const auto value = hn::BitCast(floats4, hn::LoadU(bytes16, from + 4 * i));
-        store24(to + 3 * i, hn::NearestInt(scaled(floats4, value, inside)));
-        outside = hn::Add(outside, hn::BitCast(ints4, hn::VecFromMask(floats4, hn::Not(inside))));
+        store24(to + 3 * i, hn::NearestInt(scaled(floats4, value)));
+        outside = hn::Add(outside, beyond(floats4, value, ints4));
     }
-    int32_t counts[4];  // a mask is -1
+    int32_t counts[4];
     hn::StoreU(outside, ints4, counts);
     for (const int32_t lane : counts) clipped += static_cast<size_t>(-lane);
 #endif

@@ -163,6 +163,9 @@ std::string oneLine(const Json& value) {
     std::string line = value.is_string() ? value.get<std::string>() : value.dump();
     for (char& c : line)
         if (static_cast<unsigned char>(c) < ' ' || c == 0x7F) c = ' ';
+    // Control characters of two bytes, U+0080 to U+009F.
+    for (size_t i = 0; i + 1 < line.size(); ++i)
+        if (line[i] == '\xC2' && static_cast<unsigned char>(line[i + 1]) < 0xA0) line.replace(i, 2, "  ");
     return line;
 }
 

@@ -16,6 +16,7 @@ namespace {
 
 constexpr long long kTicks = 35280000;
 constexpr int kVideo = 1, kAudio = 2;
+constexpr int kMostChannels = 32;  // of an output
 constexpr int kVideoFilter = 12, kAudioFilter = 13;
 
 struct KindRow {
@@ -383,6 +384,9 @@ void Job::addStream(JobStream& stream) {
         setChecked(encoder, "framerate", Any(stream.rate), "--rate");
     } else {
         setChecked(encoder, "samplerate", stream.samplerate, "--samplerate");
+        if (!options_.channels && stream.channels > kMostChannels)
+            throw failure(Msg::outputChannels,
+                          {outputName(), std::to_string(kMostChannels), std::to_string(stream.channels)});
         setChecked(encoder, "channels", stream.channels, "--channels");
         setChecked(encoder, "bitsPerSample", stream.bits, "--bits");
         // The header of a stream goes ahead of the sound; what may end early promises no length.

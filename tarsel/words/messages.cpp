@@ -187,6 +187,7 @@ constexpr Message kMessages[] = {
     {Msg::outputSystem,        Exit::output, "can't write {file}",                 "{text}",                                                       "{text}"},
     {Msg::outputRefused,       Exit::output, "can't write {file}",                 "{system}",                                                     "choose another name or format"},
     {Msg::outputNoStream,      Exit::output, "can't write {file}",                 "it takes no further {text}",                                   "give fewer inputs, or another format"},
+    {Msg::outputChannels,      Exit::output, "can't write {file}",                 "it takes {text} channels, the input has {text}",               "give --channels"},
     {Msg::outputNoSpace,       Exit::output, "can't write {file}",                 "it needs {text}, the disk has {text} free",                    "free some space, or choose another disk"},
     {Msg::outputNotPlaced,     Exit::output, "can't write {file}",                 "{system}",                                                     "what was there before is unchanged"},
     {Msg::outputTorn,          Exit::output, "can't write {file}",                 "{system}, and the files that it replaces could not all be put back", "'tarsel recover {text}' finishes it when the reason is gone"},

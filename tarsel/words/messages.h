@@ -187,6 +187,7 @@ enum class Msg : unsigned char {
     outputSystem,
     outputRefused,
     outputNoStream,
+    outputChannels,
     outputNoSpace,
     outputNotPlaced,
     outputTorn,

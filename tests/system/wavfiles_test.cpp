@@ -71,6 +71,8 @@ TEST_F(WavFiles, ManyChannelsKeepTheirPlaces) {
     write("stereo.wav", wavExtensible(1, 2, 48000, 16, 3), data);
     works({"transcode", "stereo.wav", "-o", "out.wav", "-y"});
     EXPECT_EQ(leNumber(out(), 40, 4), 0u) << "what two channels are anyhow is not said";
+    write("most.wav", wavFormat(3, 40, 48000, 32), std::string(40 * 4 * 10, '\0'));
+    fails(4, {"transcode", "most.wav", "-o", "no.wav"}, {"'no.wav': it takes 32 channels, the input has 40"});
     EXPECT_THAT(works({"info", "many.wav"}).out, testing::HasSubstr("12 ch, 16 bit, mask 0xfff"));
 }
 

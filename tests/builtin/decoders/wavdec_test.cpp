@@ -312,6 +312,9 @@ TEST_F(Wav, ExtendedReadsOtherFiles) {
         EXPECT_EQ(decoder.getAudioParam(0, "channelMask").toInt64(), 0x1FF);
         EXPECT_EQ(decoder.getParam("chunks").asVector().size(), 1);
     }
+    const std::string far = wavChunk("LIST", "") + format + wavChunk("axml", std::string(300000, 'd'));
+    ASSERT_EQ(openExtended(riff(far + wavChunk("data", data))), 0);
+    EXPECT_TRUE(readAll(4) == data);
     AnyDict state;
     decoder.store(state);
     WavDec other;
