@@ -210,9 +210,9 @@ std::string bigEndian(std::string file, std::size_t width, std::size_t guid = 4)
     const std::size_t end = data + 8 + leNumber(file, data + 4, 4);
     for (const std::size_t at : {std::size_t{4}, std::size_t{16}, std::size_t{24}, std::size_t{28}, data + 4})
         turn(at, 4);
-    for (const std::size_t at : {20, 22, 32, 34}) turn(at, 2);
+    for (const std::size_t at : {20UL, 22UL, 32UL, 34UL}) turn(at, 2);
     if (formatBytes == 40) {
-        for (const std::size_t at : {36, 38, 46, 48, 50}) turn(at, 2);
+        for (const std::size_t at : {36UL, 38UL, 46UL, 48UL, 50UL}) turn(at, 2);
         turn(40, 4);
         turn(44, guid);
     }

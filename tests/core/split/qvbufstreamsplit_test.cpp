@@ -323,7 +323,7 @@ TEST_F(QvBsSplitAudioTest, ChunksFollowTheSamples) {
     chunks = AnyVector(chunk("bext", "odd"), chunk("iXML", "even"));
     const std::string trailing = wavChunk("bext", "odd") + wavChunk("iXML", "even");
     for (const int split : {0, 1})
-        for (const size_t samples : {5, 6}) {
+        for (const size_t samples : {size_t{5}, size_t{6}}) {
             begin(8'000, 3, 8, split);
             unit(stream, AUDIO_AU_CODE, patternBytes(samples * 3));
             tell(stream.input(), STREAM_END_CODE);
