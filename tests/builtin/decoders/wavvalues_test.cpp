@@ -52,7 +52,7 @@ void check(wav::Convert convert, double scale) {
         for (std::size_t count = 0; count <= 5000; count += count < 40 ? 1 : 1653) {
             const auto values = samples<Value>(count);
             std::string from(count * sizeof(Value) + 1, 'x');
-            std::memcpy(&from[1], values.data(), count * sizeof(Value));
+            if (count > 0) std::memcpy(&from[1], values.data(), count * sizeof(Value));
             std::string to(3 * count + 2, 'g');
             std::size_t clipped = 0;
             std::vector<double> exact;
