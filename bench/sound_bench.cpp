@@ -13,6 +13,7 @@
 #include <vector>
 
 #include "bench/ratio.h"
+#include "builtin/decoders/wavvalues.h"
 #include "core/engine/modules/init.h"
 #include "core/engine/modules/qvregistry.h"
 #include "core/filter/qvfilter.h"
@@ -118,6 +119,27 @@ void againstCopy(const char* name, const char* module, const std::vector<Param>&
             filter->erase(filter->samples());
         },
         [&] { std::memcpy(to.data(), from.data(), bytes); });
+}
+
+// Values of files made into those of the engine.
+void fileValues(const char* name, wav::Convert convert, size_t width) {
+    const size_t count = static_cast<size_t>(bufferBytes) / width, bytes = count * (width + 3);
+    std::vector<unsigned char> from(count * width), to(count * 3 + 1);
+    for (size_t i = 0; i < count; ++i) {
+        const double value = static_cast<double>(i * 2654435761u % 16777213) / 8388608 - 1;
+        const auto single = static_cast<float>(value);
+        const auto whole = static_cast<int32_t>(value * 2147483647);
+        if (convert == wav::narrowInt32)
+            std::memcpy(&from[i * width], &whole, width);
+        else if (width == 4)
+            std::memcpy(&from[i * width], &single, width);
+        else
+            std::memcpy(&from[i * width], &value, width);
+    }
+    std::vector<char> plainFrom(bytes, 1), plainTo(bytes);
+    compare(
+        name, 2.0, [&] { benchmark::DoNotOptimize(convert(to.data(), from.data(), count)); },
+        [&] { std::memcpy(plainTo.data(), plainFrom.data(), bytes); });
 }
 
 AnyVector mean(std::initializer_list<int> channels) {
@@ -244,6 +266,9 @@ int main() {
                 {{"connMatrix", AnyVector(Any(mean({0, 4})), Any(mean({1, 5})))}}, 6, 4);
     againstCopy("chconvert, mono to stereo : copy", "chconvert", {{"connMatrix", AnyVector(Any(0), Any(0))}},
                 1, 4);
+    fileValues("wavdec, 32-bit PCM to 24 bits : copy", wav::narrowInt32, 4);
+    fileValues("wavdec, 32-bit float to 24 bits : copy", wav::narrowFloat32, 4);
+    fileValues("wavdec, 64-bit float to 24 bits : copy", wav::narrowFloat64, 8);
     rates();
     bands();
     cleanup_wrapper();

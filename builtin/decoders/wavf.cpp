@@ -5,14 +5,14 @@
 #include <cstdint>
 #include <cstring>
 #include <limits>
-#include <vector>
+#include <utility>
 
 #include "builtin/decoders/inputfile.h"
 
 namespace {
 
 constexpr int extensibleTag = 65534;
-constexpr int maxChunksBeforeFormat = 100000;
+constexpr int maxChunks = 100000;
 // Ids and text after the format are searched for "data" at this many places, the first of them three bytes
 // before the end of the format's fields.
 constexpr int dataTries = 100000;
@@ -22,24 +22,52 @@ using Id = std::array<char, 4>;
 
 bool operator==(const Id& id, const char* text) { return std::memcmp(id.data(), text, id.size()) == 0; }
 
-std::uint32_t u16(const unsigned char* p) { return static_cast<std::uint32_t>(p[0] | p[1] << 8); }
-std::uint32_t u32(const unsigned char* p) { return u16(p) | u16(p + 2) << 16; }
-std::uint64_t u64(const unsigned char* p) { return u32(p) | static_cast<std::uint64_t>(u32(p + 4)) << 32; }
+// Numbers of a file: little-endian but for "RIFX".
+struct Numbers {
+    bool bigEndian = false;
+
+    std::uint32_t u16(const unsigned char* p) const {
+        return static_cast<std::uint32_t>(bigEndian ? p[0] << 8 | p[1] : p[0] | p[1] << 8);
+    }
+    std::uint32_t u32(const unsigned char* p) const {
+        return bigEndian ? u16(p) << 16 | u16(p + 2) : u16(p) | u16(p + 2) << 16;
+    }
+    // Of little-endian files alone.
+    std::uint64_t u64(const unsigned char* p) const {
+        return u32(p) | static_cast<std::uint64_t>(u32(p + 4)) << 32;
+    }
+};
 
 struct Chunk {
     Id id{};
     std::uint32_t size = 0;
 };
 
-class HeaderReader {
+class ChunkReader {
   public:
-    HeaderReader(InputFile& file, WavHeader& header) : file_(file), header_(header) {}
+    ChunkReader(InputFile& file, bool bigEndian) : file_(file), numbers_{bigEndian} {}
+
+    bool bytesAt(long long position, void* to, std::size_t count) {
+        return file_.seek(position) && file_.read(to, 1, count) == count;
+    }
+    bool chunkAt(long long position, Chunk& chunk);
+    long long behindChunk(long long position, const Chunk& chunk);
+
+  protected:
+    InputFile& file_;
+    Numbers numbers_;
+};
+
+class HeaderReader : private ChunkReader {
+  public:
+    HeaderReader(InputFile& file, WavHeader& header, bool extended)
+        : ChunkReader(file, false), header_(header), extended_(extended) {}
 
     WavStatus read();
 
   private:
-    InputFile& file_;
     WavHeader& header_;
+    bool extended_;
     Chunk riff_;
     Id form_{};
     std::uint64_t riffSize64_ = 0;
@@ -50,12 +78,8 @@ class HeaderReader {
     int blockAlign_ = 0;
     std::uint32_t dataSize_ = 0;
 
-    bool isRf64() const { return riff_.id == "RF64" || riff_.id == "BW64"; }
-    bool bytesAt(long long position, void* to, std::size_t count) {
-        return file_.seek(position) && file_.read(to, 1, count) == count;
-    }
-    bool chunkAt(long long position, Chunk& chunk);
-    long long behindChunk(long long position, const Chunk& chunk);
+    bool isRf64() const { return extended_ && (riff_.id == "RF64" || riff_.id == "BW64"); }
+    bool isRifx() const { return extended_ && riff_.id == "RIFX"; }
     bool readDs64(long long position, std::uint32_t size);
     WavStatus findFormat();
     bool readFormat(long long position, std::uint32_t size);
@@ -63,22 +87,24 @@ class HeaderReader {
     bool findDataByChunks();
     bool findDataBySearch();
     bool takeDataAt(long long position);
-    WavStatus checkFormat() const;
+    WavStatus chooseCoding();
+    WavStatus checkFormat();
+    bool isWidth() const;
     void measure();
     bool sizeIsUnknown(std::uint32_t size, long long present);
     bool chunksFillTheRest(long long position);
 };
 
-bool HeaderReader::chunkAt(long long position, Chunk& chunk) {
+bool ChunkReader::chunkAt(long long position, Chunk& chunk) {
     unsigned char bytes[8];
     if (!bytesAt(position, bytes, sizeof bytes)) return false;
     std::memcpy(chunk.id.data(), bytes, chunk.id.size());
-    chunk.size = u32(bytes + 4);
+    chunk.size = numbers_.u32(bytes + 4);
     return true;
 }
 
 // Where the next chunk begins. Some writers forget the padding of an odd chunk.
-long long HeaderReader::behindChunk(long long position, const Chunk& chunk) {
+long long ChunkReader::behindChunk(long long position, const Chunk& chunk) {
     const long long end = position + 8 + chunk.size;
     if (chunk.size % 2 == 0) return end;
     Chunk next;
@@ -89,8 +115,8 @@ long long HeaderReader::behindChunk(long long position, const Chunk& chunk) {
 bool HeaderReader::readDs64(long long position, std::uint32_t size) {
     unsigned char bytes[16];
     if (size < sizeof bytes || !bytesAt(position, bytes, sizeof bytes)) return false;
-    riffSize64_ = u64(bytes);
-    dataSize64_ = u64(bytes + 8);
+    riffSize64_ = numbers_.u64(bytes);
+    dataSize64_ = numbers_.u64(bytes + 8);
     return true;
 }
 
@@ -98,13 +124,15 @@ WavStatus HeaderReader::findFormat() {
     unsigned char bytes[12];
     if (!bytesAt(0, bytes, sizeof bytes)) return WavStatus::cannotParse;
     std::memcpy(riff_.id.data(), bytes, 4);
-    riff_.size = u32(bytes + 4);
+    header_.bigEndian = numbers_.bigEndian = isRifx();
+    riff_.size = numbers_.u32(bytes + 4);
     std::memcpy(form_.data(), bytes + 8, 4);
 
     long long position = 12;
-    for (int i = 0; i < maxChunksBeforeFormat; ++i) {
+    for (int i = 0; i < maxChunks; ++i) {
         Chunk chunk;
-        if (!chunkAt(position, chunk) || static_cast<std::int32_t>(chunk.size) < 1) break;
+        const int smallest = extended_ ? 0 : 1;
+        if (!chunkAt(position, chunk) || static_cast<std::int32_t>(chunk.size) < smallest) break;
         if (chunk.id == "fmt ") {
             formatEnd_ = behindChunk(position, chunk);
             return readFormat(position + 8, chunk.size) ? WavStatus::ok : WavStatus::cannotParse;
@@ -124,17 +152,21 @@ bool HeaderReader::readFormat(long long position, std::uint32_t size) {
     unsigned char bytes[plainBytes + 2 + extensionBytes];
     if (size < plainBytes || !bytesAt(position, bytes, plainBytes)) return false;
     formatFieldsEnd_ = position + plainBytes;
-    header_.formatTag = static_cast<int>(u16(bytes));
-    header_.channels = static_cast<int>(u16(bytes + 2));
-    header_.samplerate = static_cast<int>(u32(bytes + 4));
-    blockAlign_ = static_cast<int>(u16(bytes + 12));
-    header_.bitsPerSample = static_cast<int>(u16(bytes + 14));
+    header_.formatTag = static_cast<int>(numbers_.u16(bytes));
+    header_.channels = static_cast<int>(numbers_.u16(bytes + 2));
+    header_.samplerate = static_cast<int>(numbers_.u32(bytes + 4));
+    blockAlign_ = static_cast<int>(numbers_.u16(bytes + 12));
+    header_.bitsPerSample = static_cast<int>(numbers_.u16(bytes + 14));
     if (header_.formatTag == 1 || size < sizeof bytes) return true;
     if (!bytesAt(position, bytes, sizeof bytes)) return false;
-    if (u16(bytes + 16) != extensionBytes) return true;
+    if (numbers_.u16(bytes + 16) != extensionBytes) return true;
     formatFieldsEnd_ = position + static_cast<long long>(sizeof bytes);
-    if (header_.formatTag == extensibleTag) header_.channelMask = u32(bytes + 20);
-    subFormat_ = static_cast<int>(u16(bytes + 24));
+    if (header_.formatTag == extensibleTag) header_.channelMask = numbers_.u32(bytes + 20);
+    subFormat_ = static_cast<int>(numbers_.u16(bytes + 24));
+    // The GUID begins with a number of 32 bits. Some writers of big-endian files take it for one of 16, or
+    // leave it little-endian.
+    if (header_.bigEndian && subFormat_ == 0) subFormat_ = static_cast<int>(numbers_.u16(bytes + 26));
+    if (header_.bigEndian && (subFormat_ & 0xFF) == 0) subFormat_ >>= 8;
     return true;
 }
 
@@ -150,11 +182,13 @@ bool HeaderReader::takeDataAt(long long position) {
 bool HeaderReader::findData() { return findDataByChunks() || findDataBySearch(); }
 
 bool HeaderReader::findDataByChunks() {
-    const long long last = formatFieldsEnd_ - 3 + dataTries - 1;
+    const long long last = extended_ ? file_.length() : formatFieldsEnd_ - 3 + dataTries - 1;
+    long long position = formatEnd_;
     Chunk chunk;
-    for (long long position = formatEnd_; position <= last && chunkAt(position, chunk);
-         position = behindChunk(position, chunk))
+    for (int i = 0; i < maxChunks && position <= last && chunkAt(position, chunk); ++i) {
         if (chunk.id == "data") return takeDataAt(position);
+        position = behindChunk(position, chunk);
+    }
     return false;
 }
 
@@ -169,12 +203,33 @@ bool HeaderReader::findDataBySearch() {
     return found != end && takeDataAt(first + (found - bytes.begin()));
 }
 
-WavStatus HeaderReader::checkFormat() const {
-    const bool pcm = header_.formatTag == 1 || (header_.formatTag == extensibleTag && subFormat_ == 1);
-    if (!pcm) return WavStatus::notPcm;
-    const bool width =
-        header_.bitsPerSample == 8 || header_.bitsPerSample == 16 || header_.bitsPerSample == 24;
-    if (!width || header_.channels < 1 || header_.channels > 8 || header_.samplerate < 1)
+WavStatus HeaderReader::chooseCoding() {
+    constexpr int pcmTag = 1, floatTag = 3, aLawTag = 6, muLawTag = 7;
+    const int tag = header_.formatTag == extensibleTag ? subFormat_ : header_.formatTag;
+    if (tag != pcmTag && !extended_) return WavStatus::notPcm;
+    switch (tag) {
+        case pcmTag: header_.coding = WavCoding::integer; return WavStatus::ok;
+        case floatTag: header_.coding = WavCoding::floating; return WavStatus::ok;
+        case aLawTag: header_.coding = WavCoding::aLaw; return WavStatus::ok;
+        case muLawTag: header_.coding = WavCoding::muLaw; return WavStatus::ok;
+        default: return WavStatus::notPcm;
+    }
+}
+
+bool HeaderReader::isWidth() const {
+    const int bits = header_.bitsPerSample;
+    if (!extended_) return bits == 8 || bits == 16 || bits == 24;
+    switch (header_.coding) {
+        case WavCoding::integer: return bits >= 1 && bits <= 32;
+        case WavCoding::floating: return bits == 32 || bits == 64;
+        default: return bits == 8;
+    }
+}
+
+WavStatus HeaderReader::checkFormat() {
+    if (const auto status = chooseCoding(); status != WavStatus::ok) return status;
+    const int most = extended_ ? wavMostChannels : 8;
+    if (!isWidth() || header_.channels < 1 || header_.channels > most || header_.samplerate < 1)
         return WavStatus::badFormat;
     // Values in wider containers, as 24 bits in four bytes; read as packed they would be noise.
     const bool padded = blockAlign_ > header_.frameBytes() && blockAlign_ % header_.channels == 0;
@@ -184,8 +239,7 @@ WavStatus HeaderReader::checkFormat() const {
 // Whole chunks from here to the end of the file: then an empty "data" chunk is meant as it stands.
 bool HeaderReader::chunksFillTheRest(long long position) {
     Chunk chunk;
-    for (int i = 0; i < maxChunksBeforeFormat && chunkAt(position, chunk); ++i)
-        position = behindChunk(position, chunk);
+    for (int i = 0; i < maxChunks && chunkAt(position, chunk); ++i) position = behindChunk(position, chunk);
     return position == file_.length();
 }
 
@@ -208,9 +262,10 @@ void HeaderReader::measure() {
     long long announced = dataSize_;
     if (from64) announced = static_cast<long long>(dataSize64_);
     if (unknown) announced = present;
-    const int valueBytes = header_.bitsPerSample / 8;
-    header_.samples = std::min(announced, present) / valueBytes / header_.channels;
-    header_.samplesAnnounced = announced / valueBytes / header_.channels;
+    const long long held = std::min(announced, present);
+    header_.samples = held / header_.valueBytes() / header_.channels;
+    header_.samplesAnnounced = announced / header_.valueBytes() / header_.channels;
+    header_.dataEnd = header_.dataOffset + held;
 
     const std::uint64_t riffSize = isRf64() && riffSize64_ > 0 ? riffSize64_ : riff_.size;
     header_.fileSize = file_.length();
@@ -220,16 +275,90 @@ void HeaderReader::measure() {
 
 WavStatus HeaderReader::read() {
     if (const auto status = findFormat(); status != WavStatus::ok) return status;
-    if (!(form_ == "WAVE") || !(riff_.id == "RIFF" || isRf64())) return WavStatus::cannotParse;
+    if (!(form_ == "WAVE") || !(riff_.id == "RIFF" || isRf64() || isRifx())) return WavStatus::cannotParse;
     if (!findData()) return WavStatus::noData;
     if (const auto status = checkFormat(); status != WavStatus::ok) return status;
     measure();
     return WavStatus::ok;
 }
 
+// --- Chunks around the samples.
+
+constexpr int mostChunks = 10000;
+constexpr std::size_t mostKept = std::size_t{16} << 20;
+
+bool isPlausible(const Id& id) {
+    return std::all_of(id.begin(), id.end(), [](char c) { return c >= ' ' && c <= '~'; });
+}
+
+// What describes the file itself, or fills it up.
+bool isOfTheFile(const Id& id) {
+    constexpr const char* own[] = {"fmt ", "fact", "data", "ds64", "PEAK", "JUNK",
+                                   "junk", "FLLR", "PAD ", "fill", "levl"};
+    return std::any_of(std::begin(own), std::end(own), [&](const char* name) { return id == name; });
+}
+
+class ChunkCollector : private ChunkReader {
+  public:
+    ChunkCollector(InputFile& file, const WavHeader& header, std::vector<WavChunk>& kept,
+                   std::vector<std::string>& others)
+        : ChunkReader(file, header.bigEndian), kept_(kept), others_(others) {}
+
+    // Those from `position` up to `end`, or to what is no chunk.
+    void collect(long long position, long long end) {
+        for (Chunk chunk; left_ > 0 && position + 8 <= end && chunkAt(position, chunk); --left_) {
+            if (!isPlausible(chunk.id) || chunk.id == "data" || position + 8 + chunk.size > end) return;
+            if (!isOfTheFile(chunk.id)) take(position + 8, chunk);
+            position = behindChunk(position, chunk);
+        }
+    }
+    bool isChunkAt(long long position) {
+        Chunk chunk;
+        return chunkAt(position, chunk) && isPlausible(chunk.id);
+    }
+
+  private:
+    std::vector<WavChunk>& kept_;
+    std::vector<std::string>& others_;
+    int left_ = mostChunks;
+    std::size_t room_ = mostKept;
+
+    bool isKept(long long contents, const Chunk& chunk) {
+        if (chunk.size == 0 || chunk.size > room_) return false;
+        if (numbers_.bigEndian || chunk.id == "iXML") return chunk.id == "iXML";
+        Id kind;
+        if (chunk.id == "LIST")
+            return chunk.size >= kind.size() && bytesAt(contents, kind.data(), kind.size()) &&
+                   (kind == "INFO" || kind == "adtl");
+        return chunk.id == "bext" || chunk.id == "cue ";
+    }
+    void take(long long contents, const Chunk& chunk) {
+        const std::string id(chunk.id.begin(), chunk.id.end());
+        std::string data;
+        if (isKept(contents, chunk)) {
+            data.resize(chunk.size);
+            if (bytesAt(contents, data.data(), data.size())) {
+                room_ -= data.size();
+                kept_.push_back({id, std::move(data)});
+                return;
+            }
+        }
+        if (std::find(others_.begin(), others_.end(), id) == others_.end()) others_.push_back(id);
+    }
+};
+
 }  // namespace
 
-WavStatus readWavHeader(InputFile& file, WavHeader& header) {
+WavStatus readWavHeader(InputFile& file, WavHeader& header, bool extended) {
     header = WavHeader();
-    return HeaderReader(file, header).read();
+    return HeaderReader(file, header, extended).read();
+}
+
+void readWavChunks(InputFile& file, const WavHeader& header, std::vector<WavChunk>& kept,
+                   std::vector<std::string>& others) {
+    ChunkCollector collector(file, header, kept, others);
+    collector.collect(12, header.dataOffset - 8);
+    // Some writers forget the padding of odd data.
+    const long long padded = header.dataEnd + (header.dataEnd - header.dataOffset) % 2;
+    collector.collect(collector.isChunkAt(padded) ? padded : header.dataEnd, file.length());
 }

@@ -5,36 +5,64 @@
 //     "fmt " size format fields
 //     anything
 //     "data" size interleaved samples
+//     chunk*
 //
 // Sizes that a recorder could not know when it wrote the header mean "to the end of the file", and a size
 // beyond the end is cut to what is there.
+//
+// Plain files have PCM of 8, 16 or 24 bits, up to 8 channels, and "RIFF". The extended reading also takes
+// other codings and widths, more channels, 64-bit sizes, and "RIFX", where all numbers are big-endian. "data"
+// may be as far away as the chunks before it take, and chunks before "fmt " may be empty.
 #pragma once
+
+#include <string>
+#include <vector>
 
 class InputFile;
 
 enum class WavStatus {
     ok = 0,
     cannotOpen = 1,
-    notPcm = 2,     // neither PCM nor extensible PCM
+    notPcm = 2,     // a coding that can't be read
     badFormat = 3,  // a count of channels, a rate or a width that can't be read
     cannotParse = 4,
     noData = 9,  // no "data" soon after the format; counts as one that can't be parsed
 };
 
+enum class WavCoding { integer, floating, aLaw, muLaw };
+
+constexpr int wavMostChannels = 256;  // of the extended reading
+
 struct WavHeader {
     long long fileSize = 0;          // bytes, as the RIFF header says, but never more than there are
-    int channels = 0;                // 1 .. 8
+    int channels = 0;                // 1 .. 8, extended 1 .. wavMostChannels
     int samplerate = 0;              // above 0
     long long samples = 0;           // that the file holds
     long long samplesAnnounced = 0;  // at least `samples`; more in a file that was cut
-    int bitsPerSample = 0;           // 8, 16 or 24
-    int formatTag = 0;               // 1, or 65534 for extensible
+    int bitsPerSample = 0;           // 8, 16 or 24; extended 1 .. 32, and 64 of floating point
+    int formatTag = 0;               // 65534 for extensible
     unsigned channelMask = 0;        // of the extensible format, else 0
-    long long dataOffset = 0;        // bytes from the start of the file
+    WavCoding coding = WavCoding::integer;
+    bool bigEndian = false;
+    long long dataOffset = 0;  // bytes from the start of the file
+    long long dataEnd = 0;     // where the samples end, before any padding
 
-    int frameBytes() const { return channels * (bitsPerSample / 8); }  // of one sample of every channel
+    int valueBytes() const { return (bitsPerSample + 7) / 8; }  // in the file; narrower values are upper bits
+    int frameBytes() const { return channels * valueBytes(); }  // of one sample of every channel
     bool truncated() const { return samplesAnnounced > samples; }
 };
 
 // Reads the header from an open file. `header` is whole only with WavStatus::ok.
-WavStatus readWavHeader(InputFile& file, WavHeader& header);
+WavStatus readWavHeader(InputFile& file, WavHeader& header, bool extended);
+
+struct WavChunk {
+    std::string id;    // four bytes
+    std::string data;  // without its padding
+};
+
+// The chunks before and after the samples of a file with that header, in their order: those with words and
+// marks ("bext", "iXML", "cue ", and "LIST" of INFO and adtl) in `kept`, the ids of all others in `others`,
+// but for what describes the file itself or fills it up. Of a big-endian file, whose chunks have big-endian
+// numbers, only iXML is kept. So is no chunk with which the kept ones would have more than 16 MiB.
+void readWavChunks(InputFile& file, const WavHeader& header, std::vector<WavChunk>& kept,
+                   std::vector<std::string>& others);

@@ -56,6 +56,7 @@ class SampleFile {
     bool isOpen() const { return file_.isOpen(); }
     bool isStream() const { return file_.isStream(); }
     uint64_t written() const { return file_.written(); }
+    uint64_t position() const { return position_; }
     int error() const { return file_.error(); }
 
   private:
@@ -70,7 +71,8 @@ class SampleFile {
 struct QvBsSplitAudio::Wav {
     struct File {
         SampleFile file;
-        QvPcm samples;  // of its channel; in split mode only
+        QvPcm samples;          // of its channel; in split mode only
+        uint64_t trailing = 0;  // bytes after the samples
     };
 
     WavFormat format{};  // of the stream
@@ -79,10 +81,12 @@ struct QvBsSplitAudio::Wav {
     std::vector<std::unique_ptr<File>> files;  // one for each channel, or the only one
     QvPcm work;                                // interleaved samples of one access unit; in split mode only
     AnyVector channelPointers;
+    std::vector<unsigned char> chunks;  // to follow the samples, as they stand in a file
+    bool mayBeRf64 = false;
     unsigned carried = 0;  // bytes of an incomplete sample at the head of the ring
 
     WavFormat fileFormat() const {
-        return {format.samplerate, split ? 1 : format.channels, format.bitsPerSample};
+        return split ? WavFormat{format.samplerate, 1, format.bitsPerSample} : format;
     }
 };
 
@@ -118,8 +122,10 @@ int QvBsSplitAudio::init(const AnyDict& newParams) {
 
 bool QvBsSplitAudio::openFiles() {
     Wav& wav = *wav_;
+    const Any& mask = params().get("channelMask");
     const WavFormat format = {params().getInt32("samplerate", 0), params().getInt32("channels", 0),
-                              params().getInt32("bitsPerSample", 0)};
+                              params().getInt32("bitsPerSample", 0),
+                              mask.isInt() ? static_cast<uint32_t>(mask.toInt64()) : 0};
     wav.format = format;
     wav.split = params().get("split").isTrue();
     const bool legal = wavFormatIsLegal(format) && (!wav.split || format.channels <= maxFiles);
@@ -127,6 +133,10 @@ bool QvBsSplitAudio::openFiles() {
     if (!legal || ring->chunksize(ring) < static_cast<unsigned>(format.sampleBytes())) {
         qv_log()->error("[split writer] Can not write WAV with %d Hz, %d channels, %d bits.",
                         format.samplerate, format.channels, format.bitsPerSample);
+        return false;
+    }
+    if (!takeChunks()) {
+        qv_log()->error("[split writer] Can not write chunks that are not \"id\" and \"data\".");
         return false;
     }
     const Any name = params().get("outfilename");
@@ -155,8 +165,31 @@ std::array<unsigned char, wavHeaderBytes> QvBsSplitAudio::streamHeader() {
     const long long samples = expected.isInt() ? expected.toInt64() : -1;
     const auto sampleBytes = static_cast<uint64_t>(format.sampleBytes());
     const bool known = samples >= 0 && static_cast<uint64_t>(samples) < wavLengthUnknown / 2 / sampleBytes;
-    return wavHeader(
-        format, known ? wavHeaderBytes + static_cast<uint64_t>(samples) * sampleBytes : wavLengthUnknown);
+    const uint64_t bytes =
+        known ? wavHeaderBytes + static_cast<uint64_t>(samples) * sampleBytes : wavLengthUnknown;
+    return wavHeader(format, {.fileBytes = bytes, .mayBeRf64 = wav_->mayBeRf64});
+}
+
+// False for what is no chunk.
+bool QvBsSplitAudio::takeChunks() {
+    constexpr size_t idBytes = 4, headBytes = 8;
+    wav_->mayBeRf64 = params().get("rf64").isTrue();
+    const Any& list = params().get("chunks");
+    if (!list.isVector()) return !list.isValid();
+    std::vector<unsigned char>& all = wav_->chunks;
+    for (const Any& chunk : list.asVector()) {
+        const std::string id = chunk.isDict() ? chunk.asDict().getString("id", "") : "";
+        const Any& data = chunk.isDict() ? chunk.asDict().get("data") : Any::invalid();
+        if (id.size() != idBytes || !data.isGeneric() || data.size() < 1) return false;
+        const auto size = static_cast<size_t>(data.size());
+        const auto* bytes = static_cast<const unsigned char*>(data.asGeneric());
+        all.reserve(all.size() + headBytes + size + 1);
+        all.insert(all.end(), id.begin(), id.end());
+        for (size_t i = 0; i < idBytes; ++i) all.push_back(static_cast<unsigned char>(size >> 8 * i));
+        all.insert(all.end(), bytes, bytes + size);
+        if (size % 2) all.push_back(0);
+    }
+    return true;
 }
 
 // Appends the file to the list, with room for the header in it.
@@ -290,6 +323,18 @@ bool QvBsSplitAudio::writeItem(int file, const unsigned char* data, unsigned byt
     return false;
 }
 
+// They begin at an even place.
+bool QvBsSplitAudio::writeChunks(int file) {
+    auto& entry = *wav_->files[static_cast<size_t>(file)];
+    const auto& chunks = wav_->chunks;
+    if (chunks.empty() || !entry.file.isOpen() || entry.file.isStream()) return true;
+    constexpr unsigned char padding = 0;
+    const unsigned odd = entry.file.position() % 2;
+    entry.trailing = odd + chunks.size();
+    return writeItem(file, &padding, odd) &&
+           writeItem(file, chunks.data(), static_cast<unsigned>(chunks.size()));
+}
+
 bool QvBsSplitAudio::closeFile(int file) {
     auto& entry = *wav_->files[static_cast<size_t>(file)];
     if (!entry.file.isOpen()) return true;
@@ -307,7 +352,10 @@ void QvBsSplitAudio::onStreamEnd() {
         qv_log()->warning("[split writer] The stream ends inside a sample: %u bytes are dropped.",
                           wav_->carried);
     bool closed = true;
-    for (size_t i = 0; i < wav_->files.size(); ++i) closed &= closeFile(static_cast<int>(i));
+    for (int i = 0; i < static_cast<int>(wav_->files.size()); ++i) {
+        closed &= writeChunks(i);
+        closed &= closeFile(i);
+    }
     if (!closed) stopProcessing();
     _writeWavHeaders();
     for (const auto& entry : wav_->files) entry->samples.destroy();
@@ -316,5 +364,7 @@ void QvBsSplitAudio::onStreamEnd() {
 
 void QvBsSplitAudio::_writeWavHeaders() {
     for (const auto& entry : wav_->files)
-        if (!entry->file.isStream()) writeWavHeader(entry->file.name(), wav_->fileFormat(), *failure());
+        if (!entry->file.isStream())
+            writeWavHeader(entry->file.name(), wav_->fileFormat(), *failure(), entry->trailing,
+                           wav_->mayBeRf64);
 }

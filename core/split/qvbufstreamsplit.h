@@ -75,6 +75,11 @@ class QV_API QvBsSplitVideo : public QvBufStreamFifoCb {
 // The header is written when STREAM_END_CODE comes; before that the file has 80 zero bytes in its place. Size
 // fields that a file beyond 4 GiB can't state are 0xFFFFFFFF, with a warning; the samples are all there.
 //
+// Parameters that are off at first add to that. "rf64" true: the header of such a large file is that of RF64
+// instead, without a warning. "channelMask" (Int32 or Int64): the places of the channels, which the header
+// states unless the file is RF64 or a split. "chunks" (see QvWavChunks): they follow the samples, in every
+// file of a split; a stream, which has to end with its samples, gets none.
+//
 // A pipe, a socket or a device gets its header at once. Its sizes are those of "expectedSamples" (Int32 or
 // Int64, of each channel), or 0xFFFFFFFF without that: readers take the stream to its end then.
 class QV_API QvBsSplitAudio : public QvBufStreamFifoCb {
@@ -100,6 +105,7 @@ class QV_API QvBsSplitAudio : public QvBufStreamFifoCb {
     int initPlain(const AnyDict& params);
     bool openFiles();
     bool openFile(const Any& name);
+    bool takeChunks();
     std::array<unsigned char, 80> streamHeader();
     static Any _channelFileName(const Any& name, int channel);
     void _onAudioBytes(unsigned bytes);
@@ -108,6 +114,7 @@ class QV_API QvBsSplitAudio : public QvBufStreamFifoCb {
     bool takeSamples(bufstream* ring, unsigned bytes);
     bool writeItem(int file, const unsigned char* data, unsigned bytes);
     void onStreamEnd();
+    bool writeChunks(int file);
     bool closeFile(int file);
     void _writeWavHeaders();
 

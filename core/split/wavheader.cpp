@@ -23,6 +23,7 @@ class Fields {
     Fields& text(const char (&fourLetters)[5]) { return bytes(fourLetters, 4); }
     Fields& u16(uint64_t value) { return number(value, 2); }
     Fields& u32(uint64_t value) { return number(std::min(value, largestSize), 4); }
+    Fields& u64(uint64_t value) { return number(value, 8); }
     Fields& bytes(const void* data, size_t count) {
         std::memcpy(at_, data, count);
         at_ += count;
@@ -45,37 +46,69 @@ bool wavFormatIsLegal(const WavFormat& format) {
            format.channels >= 1 && format.channels <= 0xFFFF / format.valueBytes();
 }
 
-std::array<unsigned char, wavHeaderBytes> wavHeader(const WavFormat& format, uint64_t fileBytes) {
+namespace {
+
+struct Sizes {
+    uint64_t riff, data;
+
+    explicit Sizes(const WavExtent& extent)
+        : riff(std::max<uint64_t>(extent.fileBytes, 8) - 8),
+          data(extent.fileBytes - std::min(extent.fileBytes, wavHeaderBytes + extent.trailing)) {}
+    bool fit() const { return riff <= largestSize; }
+};
+
+std::array<unsigned char, wavHeaderBytes> rf64Header(const WavFormat& format, const Sizes& sizes) {
+    constexpr unsigned plainFormatBytes = 16, plainFormat = 1;
+    constexpr unsigned sizesBytes = 28;
+    std::array<unsigned char, wavHeaderBytes> header;
+    const auto sampleBytes = static_cast<uint64_t>(format.sampleBytes());
+    const auto rate = static_cast<uint64_t>(format.samplerate);
+    Fields fields(header.data());
+    fields.text("RF64").u32(largestSize).text("WAVE");
+    fields.text("ds64").u32(sizesBytes).u64(sizes.riff).u64(sizes.data).u64(sizes.data / sampleBytes).u32(0);
+    fields.text("fmt ").u32(plainFormatBytes).u16(plainFormat).u16(static_cast<uint64_t>(format.channels));
+    fields.u32(rate).u32(sampleBytes * rate).u16(sampleBytes);
+    fields.u16(static_cast<uint64_t>(format.valueBytes()) * 8);
+    fields.text("data").u32(largestSize);
+    return header;
+}
+
+}  // namespace
+
+std::array<unsigned char, wavHeaderBytes> wavHeader(const WavFormat& format, const WavExtent& extent) {
+    const Sizes sizes(extent);
+    if (extent.mayBeRf64 && extent.fileBytes != wavLengthUnknown && !sizes.fit())
+        return rf64Header(format, sizes);
     std::array<unsigned char, wavHeaderBytes> header;
     const auto valueBytes = static_cast<uint64_t>(format.valueBytes());
     const auto sampleBytes = static_cast<uint64_t>(format.sampleBytes());
     const auto channels = static_cast<uint64_t>(format.channels);
     const auto rate = static_cast<uint64_t>(format.samplerate);
-    const uint64_t dataBytes = fileBytes - std::min<uint64_t>(fileBytes, wavHeaderBytes);
     Fields fields(header.data());
-    fields.text("RIFF").u32(std::max<uint64_t>(fileBytes, 8) - 8).text("WAVE");
+    fields.text("RIFF").u32(sizes.riff).text("WAVE");
     fields.text("fmt ").u32(formatBytes).u16(extensibleFormat).u16(channels).u32(rate);
     fields.u32(sampleBytes * rate).u16(sampleBytes).u16(valueBytes * 8).u16(extensionBytes);
-    fields.u16(static_cast<uint64_t>(format.bitsPerSample)).u32(0);  // no channel mask
+    fields.u16(static_cast<uint64_t>(format.bitsPerSample)).u32(format.channelMask);
     fields.bytes(pcmSubtype.data(), pcmSubtype.size());
-    fields.text("fact").u32(4).u32(dataBytes / sampleBytes * channels);
-    fields.text("data").u32(dataBytes);
+    fields.text("fact").u32(4).u32(sizes.data / sampleBytes * channels);
+    fields.text("data").u32(sizes.data);
     return header;
 }
 
-bool writeWavHeader(const QvWideString& name, const WavFormat& format, QvIoFailure& failure) {
+bool writeWavHeader(const QvWideString& name, const WavFormat& format, QvIoFailure& failure,
+                    uint64_t trailing, bool mayBeRf64) {
     StdFile file;
     bool ok = file.open(name, "r+b");
     const long long length = ok ? file.length() : -1;
     if (length >= 0) {
-        const auto header = wavHeader(format, static_cast<uint64_t>(length));
+        const auto header = wavHeader(format, {static_cast<uint64_t>(length), trailing, mayBeRf64});
         ok = file.seek(0, SEEK_SET) && file.write(header.data(), header.size());
     } else {
         ok = false;
     }
     if (!file.close()) ok = false;
     if (!ok) failure.note(file.error(), "Failed to write the header of", name);
-    if (ok && static_cast<uint64_t>(length) > largestSize + 8)
+    if (ok && !mayBeRf64 && static_cast<uint64_t>(length) > largestSize + 8)
         qv_log()->warning(
             "[split writer] %s is larger than a WAV header can state (4 GiB): its size fields are "
             "0xFFFFFFFF, all samples are in the file.",

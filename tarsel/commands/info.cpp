@@ -67,10 +67,40 @@ Json describeStream(const QvDecodePipe& decoder, int type, int number) {
         integer("samplerate", "samplerate");
         integer("channels", "channels");
         integer("bitsPerSample", "bits");
+        if (p.get("sourceFormat").isText()) stream["source_format"] = text(p.get("sourceFormat"));
+        integer("channelMask", "channel_mask");
         integer("samples", "samples");
     }
     if (p.get("duration").isDouble()) stream["duration_s"] = p.get("duration").asDouble();
     return stream;
+}
+
+// Of a dictionary of texts and numbers.
+Json plainJson(const AnyDict& dict) {
+    Json object = Json::object();
+    for (const auto [key, value] : dict) {
+        if (value->isText()) object[key] = validUtf8(text(*value));
+        if (value->isInt()) object[key] = value->toInt64();
+    }
+    return object;
+}
+
+// Words and marks of a WAV.
+void describeWords(const QvDecodePipe& decoder, Json& file) {
+    const auto& codec = static_cast<const QvCodec&>(decoder);
+    const Any chunks = codec.getParam("chunks"), others = codec.getParam("otherChunks");
+    if (chunks.isVector()) {
+        const AnyDict described = QvWavChunks::describe(chunks.asVector());
+        for (const auto [key, value] : described) {
+            if (value->isDict()) file[key] = plainJson(value->asDict());
+            if (!value->isVector()) continue;
+            file[key] = Json::array();
+            for (const Any& entry : value->asVector()) file[key].push_back(plainJson(entry.asDict()));
+        }
+    }
+    if (!others.isVector() || others.asVector().empty()) return;
+    file["other_chunks"] = Json::array();
+    for (const Any& id : others.asVector()) file["other_chunks"].push_back(id.asString(""));
 }
 
 Json describe(const Source& source) {
@@ -86,6 +116,7 @@ Json describe(const Source& source) {
             file["streams"].push_back(describeStream(source.decoder(), type, i));
     const std::string damage = source.damage();
     if (!damage.empty()) file["damage"] = damage;
+    describeWords(source.decoder(), file);
     return file;
 }
 
@@ -114,10 +145,63 @@ std::string streamLine(const Json& s) {
         if (s.contains("samplerate")) add(number("samplerate") + " Hz");
         if (s.contains("channels")) add(number("channels") + " ch");
         if (s.contains("bits")) add(number("bits") + " bit");
+        if (s.contains("source_format")) add("from " + s["source_format"].get<std::string>());
+        if (s.contains("channel_mask")) {
+            char mask[32];
+            std::snprintf(mask, sizeof mask, "mask 0x%llx", s["channel_mask"].get<long long>());
+            add(mask);
+        }
         if (s.contains("samples")) add(number("samples") + " samples");
     }
     if (s.contains("duration_s")) add(formatTime(s["duration_s"].get<double>()));
     return line;
+}
+
+// A text of the file on one line, for a terminal.
+std::string oneLine(const Json& value) {
+    std::string line = value.is_string() ? value.get<std::string>() : value.dump();
+    for (char& c : line)
+        if (static_cast<unsigned char>(c) < ' ' || c == 0x7F) c = ' ';
+    // Control characters of two bytes, U+0080 to U+009F.
+    for (size_t i = 0; i + 1 < line.size(); ++i)
+        if (line[i] == '\xC2' && static_cast<unsigned char>(line[i + 1]) < 0xA0) line.replace(i, 2, "  ");
+    return line;
+}
+
+void printWord(const char* label, const std::string& words) {
+    if (!words.empty()) print("  %-9s %s\n", label, words.c_str());
+}
+
+void printWords(const Json& file) {
+    const auto part = [](const Json& object, const char* key) {
+        return object.contains(key) ? oneLine(object[key]) : std::string();
+    };
+    if (file.contains("bext")) {
+        const Json& bext = file["bext"];
+        printWord("about", part(bext, "description"));
+        printWord("by", part(bext, "originator"));
+        const std::string date = part(bext, "originationDate"), time = part(bext, "originationTime");
+        printWord("made", date + (date.empty() || time.empty() ? "" : " ") + time);
+        printWord("reference", "sample " + part(bext, "timeReference") + " since midnight");
+    }
+    if (file.contains("info"))
+        for (const Json& entry : file["info"]) printWord(part(entry, "id").c_str(), part(entry, "text"));
+    if (file.contains("iXML")) {
+        std::string line;
+        for (const char* key : {"project", "scene", "take", "tape", "note"})
+            if (const std::string words = part(file["iXML"], key); !words.empty())
+                line += (line.empty() ? "" : ", ") + std::string(key) + " " + words;
+        printWord("iXML", line.empty() ? "present" : line);
+    }
+    if (file.contains("cues"))
+        for (const Json& cue : file["cues"])
+            printWord("cue", "sample " + part(cue, "position") +
+                                 (cue.contains("label") ? ", " + part(cue, "label") : ""));
+    if (file.contains("other_chunks")) {
+        std::string line;
+        for (const Json& id : file["other_chunks"]) line += (line.empty() ? "" : ", ") + oneLine(id);
+        printWord("also has", line);
+    }
 }
 
 void printFile(const Json& file) {
@@ -130,6 +214,7 @@ void printFile(const Json& file) {
     for (const auto& s : file["streams"])
         print("  %s %lld   %s\n", s["type"].get<std::string>().c_str(), s["number"].get<long long>(),
               streamLine(s).c_str());
+    printWords(file);
     if (file.contains("damage")) print("  damaged   %s\n", file["damage"].get<std::string>().c_str());
 }
 

@@ -7,6 +7,7 @@
 #include <set>
 
 #include "tarsel/host/files.h"
+#include "tarsel/source/wavcarry.h"
 #include "tarsel/words/messages.h"
 #include "tarsel/words/rawnames.h"
 #include "tarsel/words/timespec.h"
@@ -15,6 +16,7 @@ namespace {
 
 constexpr long long kTicks = 35280000;
 constexpr int kVideo = 1, kAudio = 2;
+constexpr int kMostChannels = 32;  // of an output
 constexpr int kVideoFilter = 12, kAudioFilter = 13;
 
 struct KindRow {
@@ -388,6 +390,9 @@ void Job::addStream(JobStream& stream) {
         setChecked(encoder, "framerate", Any(stream.rate), "--rate");
     } else {
         setChecked(encoder, "samplerate", stream.samplerate, "--samplerate");
+        if (!options_.channels && stream.channels > kMostChannels)
+            throw failure(Msg::outputChannels,
+                          {outputName(), std::to_string(kMostChannels), std::to_string(stream.channels)});
         setChecked(encoder, "channels", stream.channels, "--channels");
         setChecked(encoder, "bitsPerSample", stream.bits, "--bits");
         // The header of a stream goes ahead of the sound; what may end early promises no length.
@@ -395,7 +400,28 @@ void Job::addStream(JobStream& stream) {
             pipe_->getMuxer()
                 ->stream(kAudio, stream.encStream)
                 ->setParam("expectedSamples", Any(stream.expected));
+        carryChunks(stream);
     }
+}
+
+// Only a WAV file has room for them. A stream ends with its samples, and not every reader of a pipe knows
+// RF64.
+void Job::carryChunks(const JobStream& stream) {
+    if (writesNothing()) return;
+    const bool isFile = kind_ != OutputKind::avi && !takesOneStream();
+    QvBufStream* output = isFile ? pipe_->getMuxer()->stream(kAudio, stream.encStream) : nullptr;
+    if (output) output->setParam("rf64", 1);
+    WavPart part = {.samplerate = stream.samplerate,
+                    .channels = stream.channels,
+                    .bits = stream.bits,
+                    .changed = stream.params.filters().has_value()};
+    if (takesPart()) {
+        const int rate = intParam(stream.source->decoder(), kAudio, stream.decStream, "samplerate");
+        part.first = stream.in.position(rate);
+        part.samples = stream.out.position(rate) - part.first;
+    }
+    const std::string lost = carryWavChunks(*stream.source, stream.decStream, part, output);
+    if (!lost.empty()) warnings_.push_back(lineOf(Msg::inputChunksLost, {stream.source->name(), lost}));
 }
 
 // Nothing is written over what the job reads, or twice, and names that exist are refused before any work;

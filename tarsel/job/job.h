@@ -109,6 +109,7 @@ class Job {
     void checkCounts() const;
     void buildPipe();
     void addStream(JobStream& stream);
+    void carryChunks(const JobStream& stream);
     void checkNames();
     void checkOutputNames();
     void claim(const std::string& place, const std::string& name);

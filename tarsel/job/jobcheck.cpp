@@ -4,6 +4,7 @@
 
 #include "tarsel/host/files.h"
 #include "tarsel/job/job.h"
+#include "tarsel/source/wavcarry.h"
 #include "tarsel/words/messages.h"
 
 namespace fs = std::filesystem;
@@ -19,7 +20,9 @@ std::vector<fs::path> ofExtension(const std::vector<fs::path>& files, const char
 
 // Samples that the header of a file speaks of and its data holds; -1 when it can't be read.
 long long samplesOf(const fs::path& file) {
-    const std::unique_ptr<QvDecodePipe> decoder(QvDecFactory::decodePipe(Any(file.c_str())));
+    const Any extended = AnyDict("extended", 1);
+    const std::unique_ptr<QvDecodePipe> decoder(
+        QvDecFactory::decodePipe(Any(file.c_str()), Any(), nullptr, &extended));
     if (!decoder || decoder->nrStreams(2) != 1) return -1;
     AnyDict params;
     decoder->getStreamParams(2, 0, params);
@@ -36,6 +39,9 @@ long long samplesOf(const fs::path& file) {
 // An input that ended early is told apart from a result that is wrong.
 void Job::checkResult() {
     for (const JobStream& s : streams_) {
+        if (const long long clipped = s.type == 2 ? clippedSamples(*s.source, s.decStream) : 0; clipped > 0)
+            warnings_.push_back(lineOf(
+                Msg::inputClipped, {s.source->name(), std::to_string(clipped), std::to_string(s.decStream)}));
         const char* unit = s.type == 1 ? "frames" : "samples";
         if (s.written > s.expected) differs(options_.output, s.written, s.expected, unit);
         if (s.written == s.expected) continue;

@@ -240,8 +240,12 @@ bool isCaptionFile(const std::string& name) {
     return ext == "scc" || ext == "sc2";
 }
 
-// Half of all caption files are written in drop frame.
-Any captionParameters() { return AnyDict("dropFrameLines", 1); }
+// With which a file is opened; invalid for none. Half of all caption files are written in drop frame.
+Any openParameters(const std::string& name) {
+    if (isCaptionFile(name)) return AnyDict("dropFrameLines", 1);
+    if (QvFile::getExt(Any(name.c_str()), true) == "wav") return AnyDict("extended", 1);
+    return Any();
+}
 
 }  // namespace
 
@@ -249,7 +253,7 @@ Any captionParameters() { return AnyDict("dropFrameLines", 1); }
 void Source::refuseFile(const std::string& decoder) const {
     const std::unique_ptr<QvCodec> codec(qv_registry()->newCodec(decoder.c_str()));
     if (!codec) throw failure(Msg::inputNoDecoder, {name_});
-    if (isCaptionFile(name_)) codec->setParam("openParameters", captionParameters());
+    if (decoder == "sccdec" || decoder == "wavdec") codec->setParam("openParameters", openParameters(name_));
     codec->setParam("filename", name_.c_str());
     const bool opens = codec->open() == QvStatus::ok;
     firstBytes(name_, 1);  // a disk that fails is no fault of the format
@@ -262,9 +266,9 @@ void Source::refuseFile(const std::string& decoder) const {
 
 void Source::openFile() {
     const Any ext = QvFile::getExt(Any(name_.c_str()), true);
-    const Any params = captionParameters();
-    decoder_.reset(QvDecFactory::decodePipe(Any(name_.c_str()), Any(), nullptr,
-                                            isCaptionFile(name_) ? &params : nullptr));
+    const Any params = openParameters(name_);
+    decoder_.reset(
+        QvDecFactory::decodePipe(Any(name_.c_str()), Any(), nullptr, params.isValid() ? &params : nullptr));
     if (decoder_) return;
     const AnyVector candidates = qv_registry()->decoders(ext.asString());
     const std::unique_ptr<AnyVector> exts(qv_registry()->inputExts(false, false));

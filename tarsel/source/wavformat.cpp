@@ -1,5 +1,6 @@
 #include "tarsel/source/wavformat.h"
 
+#include <climits>
 #include <cstdio>
 #include <optional>
 #include <string_view>
@@ -11,7 +12,8 @@ namespace {
 
 constexpr unsigned kExtensible = 0xFFFE;
 constexpr size_t kHead = 1 << 16;  // bytes in which the format stands, but for odd files
-constexpr const char* kReadable = "PCM of 8, 16 or 24 bits and 1 to 8 channels";
+constexpr const char* kReadable = "PCM of 1 to 32 bits, float, A-law and mu-law of 1 to 256 channels";
+constexpr unsigned kMostChannels = 256;
 
 constexpr struct {
     unsigned tag;
@@ -35,15 +37,26 @@ constexpr struct {
 };
 
 struct Format {
-    unsigned tag = 0, channels = 0, blockBytes = 0, bits = 0;
+    unsigned tag = 0, channels = 0, blockBytes = 0, bits = 0, rate = 0;
     // Bytes of a PCM sample; 0 where the fields do not say.
     unsigned sampleBytes() const { return tag == 1 && channels > 0 ? blockBytes / channels : 0; }
+    bool padded() const { return sampleBytes() > (bits + 7) / 8; }
 };
 
-unsigned word(std::string_view bytes, size_t at) {
-    return static_cast<unsigned char>(bytes[at]) |
-           static_cast<unsigned>(static_cast<unsigned char>(bytes[at + 1])) << 8;
-}
+// Numbers of a file: little-endian but for "RIFX".
+struct Numbers {
+    bool bigEndian;
+
+    unsigned word(std::string_view bytes, size_t at) const {
+        const unsigned first = static_cast<unsigned char>(bytes[at]);
+        const unsigned second = static_cast<unsigned char>(bytes[at + 1]);
+        return bigEndian ? first << 8 | second : second << 8 | first;
+    }
+    unsigned number(std::string_view bytes, size_t at) const {
+        const unsigned first = word(bytes, at), second = word(bytes, at + 2);
+        return bigEndian ? first << 16 | second : second << 16 | first;
+    }
+};
 
 // "RIFFWAVE" of a WAV file.
 std::string formOf(std::string_view file) {
@@ -52,13 +65,21 @@ std::string formOf(std::string_view file) {
 
 // Of the chunk "fmt ".
 std::optional<Format> formatOf(std::string_view file) {
+    const Numbers numbers{file.substr(0, 4) == "RIFX"};
+    const auto word = [&](std::string_view bytes, size_t at) { return numbers.word(bytes, at); };
     for (size_t at = 12; at + 8 + 16 <= file.size();) {
-        const size_t size = word(file, at + 4) | static_cast<size_t>(word(file, at + 6)) << 16;
+        const size_t size = numbers.number(file, at + 4);
         const std::string_view fields = file.substr(at + 8, size);
         if (file.substr(at, 4) == "fmt ") {
             if (fields.size() < 16) break;
-            Format format{word(fields, 0), word(fields, 2), word(fields, 12), word(fields, 14)};
-            if (format.tag == kExtensible && fields.size() >= 26) format.tag = word(fields, 24);
+            Format format{word(fields, 0), word(fields, 2), word(fields, 12), word(fields, 14),
+                          numbers.number(fields, 4)};
+            // In the first field of a GUID, where big-endian files have it in one of its four bytes.
+            if (format.tag == kExtensible && fields.size() >= 28) {
+                format.tag = numbers.word(fields, 24);
+                if (numbers.bigEndian && format.tag == 0) format.tag = numbers.word(fields, 26);
+                if (numbers.bigEndian && (format.tag & 0xFF) == 0) format.tag >>= 8;
+            }
             return format;
         }
         at += 8 + size + size % 2;
@@ -73,24 +94,30 @@ std::string describe(const Format& format) {
     for (const auto& codec : kCodecs)
         if (codec.tag == format.tag) text = codec.name;
     if (format.bits > 0) text += ", " + std::to_string(format.bits) + " bits";
-    if (const unsigned bytes = format.sampleBytes(); bytes > (format.bits + 7) / 8)
-        text += " in " + std::to_string(bytes) + " bytes";
-    if (format.channels < 1 || format.channels > 8)
+    if (format.padded()) text += " in " + std::to_string(format.sampleBytes()) + " bytes";
+    if (format.channels < 1 || format.channels > kMostChannels)
         text += ", " + std::to_string(format.channels) + " channels";
+    if (format.rate < 1 || format.rate > INT_MAX) text += ", " + std::to_string(format.rate) + " Hz";
     return text;
 }
 
 bool readable(const Format& format) {
-    return format.tag == 1 && format.sampleBytes() == format.bits / 8 && format.channels >= 1 &&
-           format.channels <= 8 && (format.bits == 8 || format.bits == 16 || format.bits == 24);
+    if (format.channels < 1 || format.channels > kMostChannels || format.padded()) return false;
+    if (format.rate < 1 || format.rate > INT_MAX) return false;
+    switch (format.tag) {
+        case 1: return format.bits >= 1 && format.bits <= 32;
+        case 3: return format.bits == 32 || format.bits == 64;
+        case 6:
+        case 7: return format.bits == 8;
+        default: return false;
+    }
 }
 
 }  // namespace
 
 void refuseWav(const std::string& name) {
     const std::string head = firstBytes(name, kHead), form = formOf(head);
-    if (form == "RIFXWAVE") throw failure(Msg::inputFormat, {name, "big-endian sound (RIFX)", kReadable});
-    const bool wave = form == "RIFFWAVE" || form == "RF64WAVE" || form == "BW64WAVE";
+    const bool wave = form == "RIFFWAVE" || form == "RIFXWAVE" || form == "RF64WAVE" || form == "BW64WAVE";
     if (!wave) throw failure(Msg::inputNotWav, {name});
     const auto format = formatOf(head);
     if (!format) throw failure(Msg::inputWavDamaged, {name});

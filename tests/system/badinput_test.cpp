@@ -10,7 +10,7 @@ class BadInput : public Tool {};
 TEST_F(BadInput, OneLineAndTheRightStatus) {
     folder.write("empty.wav", "");
     folder.write("text.wav", "this is a letter and no sound\n");
-    folder.write("alaw.wav", riff(wavChunk("fmt ", wavFormat(6, 1, 8000, 8)) + wavChunk("data", "abcd")));
+    folder.write("adpcm.wav", riff(wavChunk("fmt ", wavFormat(0x11, 1, 8000, 4)) + wavChunk("data", "abcd")));
     folder.write("plain", "x");
     folder.write("odd.xyz", "x");
     makeYuv("clip.yuv", 1);
@@ -23,7 +23,7 @@ TEST_F(BadInput, OneLineAndTheRightStatus) {
         {"absent.wav", {"no such file"}},         {"empty.wav/below.wav", {"can't open"}},
         {"folder.wav", {"this is a folder"}},     {"empty.wav", {"the file is empty"}},
         {"fifo.wav", {"no regular file"}},        {"text.wav", {"WAV"}},
-        {"alaw.wav", {"A-law, 8 bits"}},          {"plain", {"'plain'", "tarsel formats"}},
+        {"adpcm.wav", {"IMA ADPCM, 4 bits"}},     {"plain", {"'plain'", "tarsel formats"}},
         {"odd.xyz", {"'xyz'", "tarsel formats"}}, {"clip.yuv", {"--raw"}},
     };
     for (const auto& c : cases) {
@@ -46,9 +46,10 @@ TEST_F(BadInput, TheReasonIsTheTrueOne) {
                      riff(wavChunk("fmt ", wavFormat(tag, channels, 8000, bits)) + wavChunk("data", "abcd")));
     };
     const std::string only =
-        "; only PCM of 8, 16 or 24 bits and 1 to 8 channels can be read; convert it first";
+        "; only PCM of 1 to 32 bits, float, A-law and mu-law of 1 to 256 channels can be read; convert it "
+        "first";
     wav("ima.wav", 0x11, 1, 4);
-    wav("deep.wav", 1, 12, 32);
+    wav("deep.wav", 1, 300, 64);
     folder.write("cut.wav", riff(wavChunk("fmt ", wavFormat(1, 1, 8000, 16))));
     folder.write("text.scc", "hello\n");
     folder.write("none.scc", "Scenarist_SCC V1.0\n\n");
@@ -63,7 +64,7 @@ TEST_F(BadInput, TheReasonIsTheTrueOne) {
         std::string line;
     } cases[] = {
         {{"info", "ima.wav"}, "can't open 'ima.wav': it holds IMA ADPCM, 4 bits" + only},
-        {{"info", "deep.wav"}, "can't open 'deep.wav': it holds PCM, 32 bits, 12 channels" + only},
+        {{"info", "deep.wav"}, "can't open 'deep.wav': it holds PCM, 64 bits, 300 channels" + only},
         {{"info", "cut.wav"},
          "can't open 'cut.wav': it is a damaged WAV file without usable sound data; copy or make it again"},
         {{"info", "text.scc"},

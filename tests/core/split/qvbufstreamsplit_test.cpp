@@ -37,12 +37,14 @@ struct QvBsSplitVideoTest : testing::Test {
 
 struct QvBsSplitAudioTest : testing::Test {
     void begin(int rate, int channels, int bits, int split = 0, int result = 0) {
-        const AnyDict params("outfilename", folder.file("take.wav").c_str(), "samplerate", rate, "channels",
-                             channels, "bitsPerSample", bits, "split", split, "size", 20'000, "chunk", 1001);
+        AnyDict params("outfilename", folder.file("take.wav").c_str(), "samplerate", rate, "channels",
+                       channels, "bitsPerSample", bits, "split", split, "size", 20'000, "chunk", 1001);
+        if (chunks.isValid()) params.set("chunks", chunks);
         ASSERT_EQ(stream.init(params), result) << rate << ' ' << channels << ' ' << bits << ' ' << split;
     }
     TempFolder folder;
     QvBsSplitAudio stream;
+    Any chunks;
 };
 
 TEST_F(QvBsSplitVideoTest, EachUnitIsAFileWithANumber) {
@@ -246,7 +248,7 @@ TEST_F(QvBsSplitAudioTest, TheNullDeviceIsNotLargerThanAHeaderCanState) {
 TEST(WavHeader, SizesBeyondFourGibAreTheLargestAndTold) {
     const WavFormat stereo = {48'000, 2, 16};
     const auto field = [&](uint64_t fileBytes, size_t at) {
-        const auto header = wavHeader(stereo, fileBytes);
+        const auto header = wavHeader(stereo, {fileBytes});
         return leNumber(std::string(header.begin(), header.end()), at, 4);
     };
     constexpr uint64_t most = 0xFFFFFFFF;
@@ -269,6 +271,90 @@ TEST(WavHeader, SizesBeyondFourGibAreTheLargestAndTold) {
     EXPECT_EQ(leNumber(header, 76, 4), most + 9 - 80);
     EXPECT_FALSE(writeWavHeader(qv_wide_name(folder.file("none.wav")), stereo, failure));
     EXPECT_EQ(failure.code(), ENOENT);
+}
+
+TEST(WavHeader, StatesTheChannelMaskOnRequest) {
+    const auto mask = [](const WavFormat& format) {
+        const auto bytes = wavHeader(format, {1000});
+        return leNumber(std::string(bytes.begin(), bytes.end()), 40, 4);
+    };
+    EXPECT_EQ(mask({48'000, 6, 24}), 0u);
+    EXPECT_EQ(mask({48'000, 6, 24, 0x8000'003F}), 0x8000'003Fu);
+}
+
+// Of the same length as the other, so that the samples stay where they are.
+TEST(WavHeader, Rf64HasSizesOf64Bits) {
+    const WavFormat format = {96'000, 3, 20};
+    constexpr uint64_t file = (5ULL << 30) + 80 + 26, trailing = 26;
+    const auto bytes = wavHeader(format, {file, trailing, true});
+    const std::string header(bytes.begin(), bytes.end());
+    const std::string expected = "RF64" + leBytes(0xFFFFFFFF, 4) + "WAVE" +
+                                 wavChunk("ds64", leBytes(file - 8, 8) + leBytes(5ULL << 30, 8) +
+                                                      leBytes((5ULL << 30) / 9, 8) + leBytes(0, 4)) +
+                                 wavChunk("fmt ", wavFormat(1, 3, 96'000, 24)) + "data" +
+                                 leBytes(0xFFFFFFFF, 4);
+    EXPECT_EQ(header, expected);
+    const auto id = [&](uint64_t fileBytes) {
+        return static_cast<char>(wavHeader(format, {fileBytes, 0, true})[1]);
+    };
+    EXPECT_EQ(id(0xFFFFFFFFULL + 8), 'I') << "what fits stays as it is";
+    EXPECT_EQ(id(0xFFFFFFFFULL + 9), 'F');
+    EXPECT_EQ(id(wavLengthUnknown), 'I');
+
+    TempFolder folder;
+    const std::string name = folder.write("big.wav", "");
+    std::filesystem::resize_file(name, file);
+    QvIoFailure failure;
+    qv_log()->clear();
+    ASSERT_TRUE(writeWavHeader(qv_wide_name(name), format, failure, trailing, true));
+    EXPECT_EQ(qv_log()->nrWarnings(), 0);
+    std::ifstream in(name, std::ios::binary);
+    std::string written(80, '\0');
+    in.read(written.data(), 80);
+    EXPECT_EQ(written, expected);
+}
+
+AnyDict chunk(const char* id, const std::string& data) {
+    return AnyDict("id", id, "data",
+                   Any(static_cast<const void*>(data.data()), static_cast<int>(data.size())));
+}
+
+TEST_F(QvBsSplitAudioTest, ChunksFollowTheSamples) {
+    chunks = AnyVector(chunk("bext", "odd"), chunk("iXML", "even"));
+    const std::string trailing = wavChunk("bext", "odd") + wavChunk("iXML", "even");
+    for (const int split : {0, 1})
+        for (const size_t samples : {size_t{5}, size_t{6}}) {
+            begin(8'000, 3, 8, split);
+            unit(stream, AUDIO_AU_CODE, patternBytes(samples * 3));
+            tell(stream.input(), STREAM_END_CODE);
+            stream.destroy(0);
+            EXPECT_EQ(stream.ioError(), 0);
+            const size_t bytes = split ? samples : samples * 3, padded = bytes + bytes % 2;
+            for (const std::string& name : namesIn(folder)) {
+                if (name.find('#') == std::string::npos ? split : !split) continue;
+                const std::string file = TempFolder::read(folder.file(name));
+                EXPECT_EQ(file.substr(80 + padded), trailing) << name;
+                EXPECT_EQ(leNumber(file, 4, 4), file.size() - 8);
+                EXPECT_EQ(leNumber(file, 76, 4), bytes);
+                EXPECT_EQ(leNumber(file, 68, 4), bytes);
+            }
+        }
+    for (const Any& bad :
+         {Any(1), Any(AnyVector(1)), Any(AnyVector(chunk("abc", "d"))),
+          Any(AnyVector(AnyDict("id", "abcd", "data", "text"))), Any(AnyVector(chunk("abcd", "")))}) {
+        chunks = bad;
+        begin(8'000, 1, 8, 0, -1);
+    }
+}
+
+TEST_F(QvBsSplitAudioTest, ADiscThatIsFullAtTheChunksIsTold) {
+    FullDisc disc(100'000);
+    PlatformScope scope(disc);
+    chunks = AnyVector(chunk("iXML", std::string(200'000, 'x')));
+    begin(1000, 2, 16);
+    unit(stream, AUDIO_AU_CODE, patternBytes(4000));
+    tell(stream.input(), STREAM_END_CODE);
+    EXPECT_EQ(stream.ioError(), ENOSPC);
 }
 
 }  // namespace
