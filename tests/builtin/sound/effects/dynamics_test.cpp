@@ -137,6 +137,10 @@ TEST(Dynamics, StatesAndRefusals) {
     EXPECT_EQ(filter.write(pcm), 0);
     EXPECT_EQ(filter.close(), 0);
     EXPECT_EQ(filter.samples(), 1) << "what waits stays";
+    filter.setParam("_channels", 9);
+    EXPECT_EQ(filter.open(), -1);
+    EXPECT_STREQ(filter.errorDesc(), "dynamics works on up to 8 channels, the sound has 9");
+    filter.setParam("_channels", 8);
     EXPECT_EQ(filter.open(), 0);
     filter.erase(1);
     pcm = soundOf(Values(9, 1), 9);

@@ -92,16 +92,21 @@ TEST(QvNormalizer, ParametersAreCheckedAndStored) {
     AnyDict state;
     filter.store(state);
     EXPECT_FALSE(state.isSet("target"));
-    filter.setParam("target", -16);
-    filter.store(state);
-    EXPECT_EQ(other.restore(state), 0);
-    EXPECT_EQ(other.getParam("mode"), Any("loudness"));
-    EXPECT_EQ(other.getParam("target"), Any(-16.0));
+    for (const double target : {-16.0, -3.0}) {  // the latter is the default of another mode
+        filter.setParam("target", target);
+        filter.store(state);
+        EXPECT_EQ(other.restore(state), 0);
+        EXPECT_EQ(other.getParam("mode"), Any("loudness"));
+        EXPECT_EQ(other.getParam("target"), Any(target));
+    }
+    state.set("target", 5.0), state.set("mode", "loud");
+    EXPECT_NE(other.restore(state), 0);
+    EXPECT_EQ(other.getParam("target"), Any(-3.0)) << "one bad value, and none is taken";
     QvPcm pcm = soundOf({1, 2}, 2);
     EXPECT_EQ(failureOf([&] { other.write(pcm); }), "Not opened");
     other.open();
     pcm.init(1, 2, 2, 48000);
-    EXPECT_EQ(other.write(pcm), -1);
+    EXPECT_EQ(failureOf([&] { other.write(pcm); }), "Only 32 bit samples supported");
 }
 
 }  // namespace
