@@ -1,8 +1,10 @@
 // The automatic audio chain. Between its first and last stage samples are 32 bits wide.
 #include <algorithm>
+#include <string>
 #include <utility>
 
 #include "core/arch/qvassert.h"
+#include "core/engine/modules/optionalparam_p.h"
 #include "core/engine/qvutil.h"
 #include "core/filter/chainfilters_p.h"
 #include "core/filter/qvprocesspipe.h"
@@ -56,11 +58,20 @@ bool isIdentity(const AnyVector& matrix) {
     return true;
 }
 
+// Of a setting that the caller chose.
+void setValue(QvAudioFilter& filter, const char* name, const char* value) {
+    if (qvSetOptionalParam(filter, name, value) == QvStatus::ok) return;
+    const std::string refused = std::string(filter.name()) + " does not take " + name + "=" + value;
+    QV_FAIL(*filter.errorDesc() ? filter.errorDesc() : refused.c_str());
+}
+
 AudioFilterPtr newRateConverter(const AudioJobDescription& job) {
     if (job.inSamplerate == job.outSamplerate) return nullptr;
     auto converter = qvchain::requireAudioFilter("srconvert");
     converter->setParam("inSamplerate", job.inSamplerate);
     converter->setParam("outSamplerate", job.outSamplerate);
+    const std::string& quality = job.conversion.rateQuality;
+    if (quality != AudioConversion().rateQuality) setValue(*converter, "quality", quality.c_str());
     return converter;
 }
 
@@ -72,9 +83,10 @@ AudioFilterPtr newChannelConverter(const AudioJobDescription& job) {
     return converter;
 }
 
-AudioFilterPtr newQuantizer(int bits) {
+AudioFilterPtr newQuantizer(int bits, const std::string& dither = AudioConversion().dither) {
     auto quantizer = qvchain::requireAudioFilter("aquant");
     quantizer->setParam("outBitsPerSample", bits);
+    if (dither != AudioConversion().dither) setValue(*quantizer, "dither", dither.c_str());
     return quantizer;
 }
 
@@ -89,6 +101,12 @@ void takeOutDelays(qvchain::AudioFilters& filters, MediaTime& startOffset) {
         startOffset = MediaTime(-ms / 1000.0, MediaTime::defaultTimescale);
         return true;
     });
+}
+
+// A filter that has a highest number of channels can refuse more before the run begins.
+void announceChannels(const qvchain::AudioFilters& filters, int channels) {
+    for (const auto& filter : filters)
+        if (filter->getParam("_maxChannels").isInt32()) qvSetOptionalParam(*filter, "_channels", channels);
 }
 
 void append(QvAProcessPipe& pipe, AudioFilterPtr filter) {
@@ -106,6 +124,9 @@ QvAProcessPipe* QvProcessUtil::createAudioPipe(const AudioJobDescription& job, M
     takeOutDelays(front, delayOut);
     takeOutDelays(back, delayOut);
 
+    announceChannels(front, job.inChannels);
+    announceChannels(back, job.outChannels);
+
     auto rate = newRateConverter(job);
     auto channels = newChannelConverter(job);
     if (!rate && !channels && job.inBitsPerSample == job.outBitsPerSample && front.empty() && back.empty())
@@ -120,6 +141,6 @@ QvAProcessPipe* QvProcessUtil::createAudioPipe(const AudioJobDescription& job, M
     append(*pipe, std::move(channels));
     append(*pipe, std::move(rate));
     for (auto& filter : back) append(*pipe, std::move(filter));
-    append(*pipe, newQuantizer(job.outBitsPerSample));
+    append(*pipe, newQuantizer(job.outBitsPerSample, job.conversion.dither));
     return pipe.release();
 }
