@@ -2,14 +2,22 @@
 
 #include <algorithm>
 
+#include "tarsel/words/listvalue.h"
 #include "tarsel/words/messages.h"
 
 namespace {
 
-// The text up to a comma, which goes as well. A backslash takes the meaning from what follows it.
+// The text up to a comma, which goes as well. A backslash takes the meaning from what follows it, and a list
+// as the value is taken whole.
 std::string takePart(std::string_view& text) {
     std::string part;
     while (!text.empty()) {
+        if (!part.empty() && part.find('=') == part.size() - 1) {
+            const size_t list = listLength(text);
+            part += text.substr(0, list);
+            text.remove_prefix(list);
+            if (text.empty()) break;
+        }
         const char c = text[0];
         const bool escaped = c == '\\' && text.size() > 1 && (text[1] == ',' || text[1] == '\\');
         text.remove_prefix(1);

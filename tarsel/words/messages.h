@@ -24,6 +24,7 @@ enum class Msg : unsigned char {
     keyNotPair,
     keyUnknown,
     keyRepeated,
+    listWrong,
     // values of options
     timeWrong,
     timeCountsFrames,
@@ -121,6 +122,7 @@ enum class Msg : unsigned char {
     // filters and modules
     filterUnknown,
     filterNoStream,
+    filterChannels,
     effectNoPicture,
     filterPlaceTaken,
     filterFileMissing,
