@@ -1,4 +1,7 @@
 // The normalizer in a pipe, from its report to what comes out.
+#include <cmath>
+#include <numbers>
+
 #include "core/arch/qvexception.h"
 #include "core/engine/modules/qvregistry.h"
 #include "core/filter/qvprocesspipe.h"
@@ -7,11 +10,20 @@
 #include "core/media/qvloudness.h"
 #include "core/transcode/run/qvtranscoder.h"
 #include "core/transcode/task/qvtranscodetask.h"
-#include "tests/builtin/sound/effects/effect_sounds.h"
+#include "tests/builtin/sound/sounds.h"
 #include "tests/support/engine.h"
 #include "tests/support/fake_streams.h"
 
 namespace {
+
+Values sine(int samples, int channels, double amplitude, double hertz) {
+    Values values;
+    for (int i = 0; i < samples; ++i)
+        values.insert(values.end(), static_cast<std::size_t>(channels),
+                      static_cast<int>(std::lround(amplitude * (1 << 23) *
+                                                   std::sin(2 * std::numbers::pi * hertz * i / 48000))));
+    return values;
+}
 
 // One stream of 32-bit samples, as a mixed input has them.
 class WideDecoder : public FakeDecoder {

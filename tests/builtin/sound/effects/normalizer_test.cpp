@@ -1,7 +1,9 @@
 #include "builtin/sound/effects/normalizer.h"
 
+#include <cmath>
+
 #include "core/filter/qvfilter.h"
-#include "tests/builtin/sound/effects/effect_sounds.h"
+#include "tests/builtin/sound/sounds.h"
 
 namespace {
 
@@ -17,7 +19,7 @@ AnyDict with(AnyDict params, const AnyDict& levels) {
     return params;
 }
 
-double gainOf(const AnyDict& params) { return Opened(params).filter.getParam("gain").asFloat(99.0); }
+double gainOf(const AnyDict& params) { return Opened(params).getParam("gain").asFloat(99.0); }
 
 TEST(QvNormalizer, ReachesItsTargetAsFarAsTheTruePeakAllows) {
     const double none = -HUGE_VAL;
@@ -71,7 +73,7 @@ TEST(QvNormalizer, TheGainIsLinearAndBounded) {
             << gain;
     }
     Opened unknown;
-    EXPECT_EQ(unknown.through(in, 16, 100), in);
+    EXPECT_EQ(throughFilter(unknown, in, 16, {100}), in);
 }
 
 TEST(QvNormalizer, ParametersAreCheckedAndStored) {

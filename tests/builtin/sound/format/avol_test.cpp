@@ -4,7 +4,7 @@
 #include <cmath>
 
 #include "core/arch/qvassert.h"
-#include "tests/builtin/sound/format/sound_blocks.h"
+#include "tests/builtin/sound/sounds.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/vector_targets.h"
 

@@ -9,7 +9,7 @@
 #include "builtin/sound/format/resampler.h"
 #include "builtin/sound/format/soxrrate.h"
 #include "core/engine/modules/qvregistry.h"
-#include "tests/builtin/sound/format/sound_blocks.h"
+#include "tests/builtin/sound/sounds.h"
 #include "tests/support/engine.h"
 #include "tests/support/fake_streams.h"
 #include "tests/support/log_capture.h"
