@@ -13,9 +13,11 @@ std::string takePart(std::string_view& text) {
     std::string part;
     while (!text.empty()) {
         if (!part.empty() && part.find('=') == part.size() - 1) {
-            const size_t list = listLength(text);
-            part += text.substr(0, list);
-            text.remove_prefix(list);
+            std::string_view list = text.substr(0, listLength(text));
+            if (list.find("\\,") != std::string_view::npos)
+                list = {};  // a name with brackets, written as ever
+            part += list;
+            text.remove_prefix(list.size());
             if (text.empty()) break;
         }
         const char c = text[0];
