@@ -24,7 +24,7 @@ constexpr Message kMessages[] = {
     {Msg::keyNotPair,       Exit::usage, "{option}",                       "{name} is not of the form key=value",                      "write key=value,key=value"},
     {Msg::keyUnknown,       Exit::usage, "{option}",                       "unknown key {name}",                                       "{hint}the keys are {text}"},
     {Msg::keyRepeated,      Exit::usage, "{option}",                       "the key {name} is given twice, and only one value counts", "leave one out"},
-    {Msg::listWrong,        Exit::usage, "{option}",                       "{name} is no list",                                        "write it in JSON, such as [1,[0,1],-1]; 'tarsel modules' says what is in it"},
+    {Msg::listWrong,        Exit::usage, "{option}",                       "{name} is no list",                                        "give a JSON array; 'tarsel modules' says what is in it"},
     // values of options
     {Msg::timeWrong,        Exit::usage, "{option}", "{name} is not a time",                                  "use SS[.mmm], MM:SS, HH:MM:SS[.mmm], 120f, HH:MM:SS:FF or HH:MM:SS;FF"},
     {Msg::timeCountsFrames, Exit::usage, "{option}", "{name} counts frames, but the input has no frame rate", "give seconds"},

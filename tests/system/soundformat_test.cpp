@@ -82,7 +82,7 @@ TEST_F(SoundFormat, ListsAreGivenInJson) {
               wanted);
     for (size_t i = 0; i < wanted.size(); ++i) wanted[i] = in[i ^ 1];
     EXPECT_EQ(run("chconvert:connMatrix=[1,[0]],_front=1"), wanted);
-    for (const auto& [value, says] : {std::pair{"5", "'5' is no list; write it in JSON"},
+    for (const auto& [value, says] : {std::pair{"5", "'5' is no list; give a JSON array"},
                                       {"[1,2", "is not of the form key=value"},
                                       {"[1", "'[1' is no list"},
                                       {"{}", "'{}' is no list"},
