@@ -91,7 +91,7 @@ TEST_F(SoundFormat, ListsAreGivenInJson) {
               {"transcode", "take.wav", "--filter", std::string("audiolevel:volume_list_0=") + value, "-o",
                "no.wav"},
               {says});
-    fails(2, {"transcode", "testgen:duration=0.1", "--filter", "logo:filename=[a\\,b].png", "-o", "no.yuv"},
+    fails(3, {"transcode", "testgen:duration=0.1", "--filter", "logo:filename=[a\\,b].png", "-o", "no.yuv"},
           {"[a,b].png"});
     const std::string deep = std::string(40, '[') + std::string(40, ']');
     fails(2, {"transcode", "take.wav", "--filter", "chconvert:connMatrix=" + deep, "-o", "no.wav"},
