@@ -20,6 +20,9 @@ class SoundFilter : public QvAudioFilter {
     int samples() const override { return output_.samples(); }
     QvPcm* pcm() override { return &output_; }
     int erase(int n) override { return output_.erase(n); }
+    // "_maxChannels": how many channels the filter works on, for those that leave others silent or refuse
+    // them.
+    void getParam(const char* name, Any& value) const override;
 
     using QvAudioFilter::getParam;
 
@@ -28,18 +31,29 @@ class SoundFilter : public QvAudioFilter {
     explicit SoundFilter(const char* tag) : tag_(tag) {}
 
     bool opened() const;
-    // The assertions "Not inited" and "Not opened".
+    // The assertions "Not inited" and "Not opened", the latter for samples of 4 bytes also "Only 32 bit
+    // samples supported".
     void requireInited() const;
     void requireOpened() const;
-    // Adds `count` samples, whose contents are the caller's to fill, after those that wait in the output. The
-    // first call after open gives the output its format, which must stay. The place of the first one goes to
-    // `room`. 0, -3 without memory or -1 for another format, with a text; the output keeps what it had then.
-    int makeRoom(const QvPcmFormat& format, int count, unsigned char*& room);
+    void requireWide(const QvPcm& pcm) const;
+    // Adds `count` samples, whose contents are the caller's to fill, after those that wait in a buffer. The
+    // first call gives it its format, which must stay. The place of the first one goes to `room`, null for
+    // none. 0, -3 without memory or -1 for another format, with a text; the buffer keeps what it had then.
+    int makeRoom(QvPcm& buffer, const QvPcmFormat& format, int count, unsigned char*& room);
+    int makeRoom(const QvPcmFormat& format, int count, unsigned char*& room) {
+        return makeRoom(output_, format, count, room);
+    }
+    // The same for as many values of 32 bits as `like` has samples, of `channels` channels at its rate.
+    int makeWideRoom(const QvPcm& like, int channels, int32_t*& room);
+    virtual int maxChannels() const { return 0; }  // 0: any number
+    // Warns, once after each open, of channels that the filter leaves silent.
+    void warnOfSilence(int channels);
 
     QvPcm output_;
 
   private:
     const char* tag_;
+    bool warned_ = false;
 };
 
 // The same with parameters: `rows` is the constexpr table of the settings. What is stored is each filter's

@@ -331,18 +331,18 @@ class SelectedFor {
 
 }  // namespace
 
-QvAudioStreamReport* QvDecodePipe::getAudioStreamReport(int stream) {
+QvAudioStreamReport* QvDecodePipe::getAudioStreamReport(int stream, const QvReadWatch& watch) {
     if (stream < 0 || static_cast<std::size_t>(stream) >= p_->reports.size()) return nullptr;
     auto& kept = p_->reports[static_cast<std::size_t>(stream)];
     if (!kept) {
         const SelectedFor selection(*this, stream);
-        kept = makeReport(stream);
-        if (kept) seekToSample(0, stream);
+        kept = makeReport(stream, watch);
+        seekToSample(0, stream);
     }
     return kept.get();
 }
 
-std::unique_ptr<QvAudioStreamReport> QvDecodePipe::makeReport(int stream) {
+std::unique_ptr<QvAudioStreamReport> QvDecodePipe::makeReport(int stream, const QvReadWatch& watch) {
     const Any channels = getAudioParam(stream, "channels");
     const Any samplerate = getAudioParam(stream, "samplerate");
     const Any bits = getAudioParam(stream, "bitsPerSample");
@@ -361,6 +361,7 @@ std::unique_ptr<QvAudioStreamReport> QvDecodePipe::makeReport(int stream) {
         if (!pcm) return nullptr;
         QV_ASSERT(result == QvStatus::endOfStream || pcm->samples() == count);
         report->processGroup(*pcm);
+        if (watch && !watch(static_cast<double>(total - left) / static_cast<double>(total))) return nullptr;
     }
     return report;
 }

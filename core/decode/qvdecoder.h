@@ -30,6 +30,7 @@
 // "samplesExpected", what the source announces. Without truncation these keys are absent.
 #pragma once
 
+#include <functional>
 #include <memory>
 
 #include "core/arch/api.h"
@@ -53,6 +54,10 @@ struct QV_API QvElementaryStream {
     Any videoCodec = Any("N/A");  // video only
     int pid = -1;                 // program ID, -1 when the stream has none
 };
+
+// Of an operation that reads a stream for long: gets what part of it is done, 0 to 1, after each block of
+// some thousand samples; false ends it. May be empty.
+using QvReadWatch = std::function<bool(double part)>;
 
 class QV_API QvDecodePipe : public QvCodec {
   public:
@@ -144,12 +149,13 @@ class QV_API QvDecodePipe : public QvCodec {
 
     // Peak levels of a stream, made by reading it once from start to end on the first call; the stream is at
     // sample 0 afterwards. Null: no such stream, or it can't be read. Owned by the decoder, until close.
-    QvAudioStreamReport* getAudioStreamReport(int stream);
+    // Also null, with nothing kept, when `watch` ended it.
+    QvAudioStreamReport* getAudioStreamReport(int stream, const QvReadWatch& watch = {});
 
   private:
     struct Private;
     std::unique_ptr<Private> p_;
 
-    std::unique_ptr<QvAudioStreamReport> makeReport(int stream);
+    std::unique_ptr<QvAudioStreamReport> makeReport(int stream, const QvReadWatch& watch);
     AnyVector* overrideList(int type) const;
 };

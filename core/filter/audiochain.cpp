@@ -1,10 +1,12 @@
 #include "core/filter/audiochain_p.h"
 
 #include <algorithm>
+#include <string>
 #include <utility>
 
 #include "core/arch/qvassert.h"
 #include "core/engine/modules/moduletraits_p.h"
+#include "core/engine/modules/optionalparam_p.h"
 #include "core/engine/qvutil.h"
 #include "core/filter/chainfilters_p.h"
 #include "core/filter/qvprocesspipe.h"
@@ -57,11 +59,20 @@ bool isIdentity(const AnyVector& matrix) {
     return true;
 }
 
+// Of a setting that the caller chose.
+void setValue(QvAudioFilter& filter, const char* name, const char* value) {
+    if (qvSetOptionalParam(filter, name, value) == QvStatus::ok) return;
+    const std::string refused = std::string(filter.name()) + " does not take " + name + "=" + value;
+    QV_FAIL(*filter.errorDesc() ? filter.errorDesc() : refused.c_str());
+}
+
 AudioFilterPtr newRateConverter(const AudioJobDescription& job) {
     if (job.inSamplerate == job.outSamplerate) return nullptr;
     auto converter = qvchain::requireAudioFilter("srconvert");
     converter->setParam("inSamplerate", job.inSamplerate);
     converter->setParam("outSamplerate", job.outSamplerate);
+    const std::string& quality = job.conversion.rateQuality;
+    if (quality != AudioConversion().rateQuality) setValue(*converter, "quality", quality.c_str());
     return converter;
 }
 
@@ -73,9 +84,10 @@ AudioFilterPtr newChannelConverter(const AudioJobDescription& job) {
     return converter;
 }
 
-AudioFilterPtr newQuantizer(int bits) {
+AudioFilterPtr newQuantizer(int bits, const std::string& dither = AudioConversion().dither) {
     auto quantizer = qvchain::requireAudioFilter("aquant");
     quantizer->setParam("outBitsPerSample", bits);
+    if (dither != AudioConversion().dither) setValue(*quantizer, "dither", dither.c_str());
     return quantizer;
 }
 
@@ -90,6 +102,12 @@ void takeOutDelays(qvchain::AudioFilters& filters, MediaTime& startOffset) {
         startOffset = MediaTime(-ms / 1000.0, MediaTime::defaultTimescale);
         return true;
     });
+}
+
+// A filter that has a highest number of channels can refuse more before the run begins.
+void announceChannels(const qvchain::AudioFilters& filters, int channels) {
+    for (const auto& filter : filters)
+        if (filter->getParam("_maxChannels").isInt32()) qvSetOptionalParam(*filter, "_channels", channels);
 }
 
 void append(QvAProcessPipe& pipe, AudioFilterPtr filter) {
@@ -108,6 +126,9 @@ std::unique_ptr<QvAProcessPipe> qvchain::createAudioPipe(const AudioJobDescripti
     takeOutDelays(front, delayOut);
     takeOutDelays(back, delayOut);
 
+    announceChannels(front, job.inChannels);
+    announceChannels(back, job.outChannels);
+
     auto rate = newRateConverter(job);
     auto channels = newChannelConverter(job);
     if (!rate && !channels && job.inBitsPerSample == job.outBitsPerSample && front.empty() && back.empty())
@@ -122,6 +143,6 @@ std::unique_ptr<QvAProcessPipe> qvchain::createAudioPipe(const AudioJobDescripti
     append(*pipe, std::move(channels));
     append(*pipe, std::move(rate));
     for (auto& filter : back) append(*pipe, std::move(filter));
-    append(*pipe, newQuantizer(job.outBitsPerSample));
+    append(*pipe, newQuantizer(job.outBitsPerSample, job.conversion.dither));
     return pipe;
 }

@@ -45,8 +45,9 @@ std::unique_ptr<QvAudioFilter> copyOf(const QvAudioFilter& filter) {
 
 class Measurement {
   public:
-    Measurement(const QvAProcessPipe& pipe, int filters, std::span<const AnyDict> reports)
-        : model_(pipe), filters_(filters), reports_(reports) {}
+    Measurement(const QvAProcessPipe& pipe, int filters, std::span<const AnyDict> reports,
+                const QvReadWatch& watch)
+        : model_(pipe), filters_(filters), reports_(reports), watch_(watch) {}
 
     bool add(const qvchain::SoundRange& range) {
         const bool selected = range.decoder->isSelected(qvAudioStream, range.stream);
@@ -90,8 +91,15 @@ class Measurement {
         return meter_.add(pcm) == QvStatus::ok || failed("the sound changes its format, or memory is short");
     }
 
+    // After a block, with what is left of a range.
+    bool goOn(long long left, long long all) {
+        const double part = 1 - static_cast<double>(left) / static_cast<double>(all);
+        return !watch_ || watch_(part) || failed("it was stopped");
+    }
+
     bool addPlain(const qvchain::SoundRange& range) {
-        for (long long left = length(range); left > 0;) {
+        const long long all = length(range);
+        for (long long left = all; left > 0;) {
             const int wanted = static_cast<int>(std::min<long long>(left, blockSamples));
             const int result = range.decoder->readSamples(wanted, range.stream);
             if (result < 0 && result != QvStatus::endOfStream)
@@ -101,6 +109,7 @@ class Measurement {
             if (count > 0 && !measure(*pcm)) return false;
             if (result == QvStatus::endOfStream || count < 1) break;
             left -= count;
+            if (!goOn(left, all)) return false;
         }
         return true;
     }
@@ -111,7 +120,8 @@ class Measurement {
         if (!chain) return false;
         if (chain->open() != QvStatus::ok) return failed(chain->errorDesc());
         int result = QvStatus::ok;
-        for (long long left = outputOf(*chain, length(range)); left > 0 && result == QvStatus::ok;) {
+        const long long all = outputOf(*chain, length(range));
+        for (long long left = all; left > 0 && result == QvStatus::ok;) {
             const int wanted = static_cast<int>(std::min<long long>(left, blockSamples));
             result = chain->process(range.decoder, range.stream, wanted);
             if (result != QvStatus::ok && result != QvStatus::endOfStream)
@@ -123,6 +133,7 @@ class Measurement {
             if (!measure(due)) return false;
             left -= due.samples();
             chain->erase(pcm->samples());
+            if (!goOn(left, all)) return false;
         }
         return true;
     }
@@ -158,6 +169,7 @@ class Measurement {
     const QvAProcessPipe& model_;
     const int filters_;
     const std::span<const AnyDict> reports_;
+    const QvReadWatch& watch_;
     QvLoudness meter_;
     bool metering_ = false;
     std::string why_;
@@ -166,8 +178,9 @@ class Measurement {
 }  // namespace
 
 bool qvchain::measureBefore(const QvAProcessPipe& pipe, int filter, std::span<const AnyDict> reports,
-                            std::span<const SoundRange> ranges, AnyDict& levels, std::string& why) {
-    Measurement measurement(pipe, filter, reports);
+                            std::span<const SoundRange> ranges, const QvReadWatch& watch, AnyDict& levels,
+                            std::string& why) {
+    Measurement measurement(pipe, filter, reports, watch);
     for (const SoundRange& range : ranges) {
         if (measurement.add(range)) continue;
         why = measurement.why();

@@ -5,10 +5,10 @@
 #include <string>
 #include <vector>
 
+#include "core/decode/qvdecoder.h"
 #include "core/value/anycontainer.h"
 
 class QvAProcessPipe;
-class QvDecodePipe;
 
 namespace qvchain {
 
@@ -23,8 +23,9 @@ struct SoundRange {
 // Adds the levels of QvReportNeed::loudness to `levels`: those of the ranges, one after the other, each
 // through a second chain of the filters 0 .. filter - 1 of `pipe`, set up as they are and with their
 // `reports` (empty: none). The streams stand at their beginnings afterwards. False, with the reason, if that
-// is not possible.
+// is not possible or `watch` ended it.
 bool measureBefore(const QvAProcessPipe& pipe, int filter, std::span<const AnyDict> reports,
-                   std::span<const SoundRange> ranges, AnyDict& levels, std::string& why);
+                   std::span<const SoundRange> ranges, const QvReadWatch& watch, AnyDict& levels,
+                   std::string& why);
 
 }  // namespace qvchain

@@ -42,14 +42,34 @@ int reportNeed(const QvAudioFilter& filter) {
 }
 
 // A report is of samples of up to three bytes; those of a mixed input have four.
-const QvAudioStreamReport* levelReport(QvDecodePipe& decoder, int stream) {
+const QvAudioStreamReport* levelReport(QvDecodePipe& decoder, int stream, const QvReadWatch& watch) {
     constexpr int widest = 3;
     const bool measurable = stream >= 0 && stream < decoder.nrAudioStreams() &&
                             decoder.getAudioParam(stream, "bytesPerSample").asInt32(0) <= widest;
-    const auto* report = measurable ? decoder.getAudioStreamReport(stream) : nullptr;
-    if (!report) qv_log()->error("Can not get audio stream report");
-    return report;
+    return measurable ? decoder.getAudioStreamReport(stream, watch) : nullptr;
 }
+
+// Several readings in a row as one, for who watches them.
+class ReadingSteps {
+  public:
+    ReadingSteps(const QvReadWatch& watch, std::ptrdiff_t count)
+        : watch_(watch), count_(static_cast<double>(count)) {}
+
+    QvReadWatch next() {
+        if (!watch_) return {};
+        return [this, before = done_++](double part) {
+            ended_ = !watch_((before + part) / count_);
+            return !ended_;
+        };
+    }
+    bool ended() const { return ended_; }
+
+  private:
+    const QvReadWatch& watch_;
+    const double count_;
+    double done_ = 0;
+    bool ended_ = false;
+};
 
 void giveReport(QvAudioFilter& filter, const AnyDict& levels) {
     try {
@@ -106,15 +126,18 @@ QvAProcessPipe* QvProcessUtil::createAudioPipe(const AudioJobDescription& job, M
     return qvchain::createAudioPipe(job, delayOut).release();
 }
 
-void QvProcessUtil::applyStreamReport(QvAProcessPipe* pipe, QvDecodePipe* decoder, int decoderStream,
-                                      long long from, long long to) {
+bool QvProcessUtil::applyStreamReport(QvAProcessPipe* pipe, QvDecodePipe* decoder, int decoderStream,
+                                       long long from, long long to, const QvReadWatch& watch) {
     std::vector<int> needs;
     for (int i = 0; i < pipe->nrFilters(); ++i) needs.push_back(reportNeed(*pipe->filter(i)));
     const int most = needs.empty() ? QvReportNeed::none : *std::max_element(needs.begin(), needs.end());
-    if (most == QvReportNeed::none) return;
+    if (most == QvReportNeed::none) return true;
     qv_log()->info("Obtaining input stream report, needed by some of the audio filters");
-    const auto* report = levelReport(*decoder, decoderStream);
-    if (!report && most < QvReportNeed::loudness) return;
+    ReadingSteps steps(watch, 1 + std::count(needs.begin(), needs.end(), QvReportNeed::loudness));
+    const auto* report = levelReport(*decoder, decoderStream, steps.next());
+    if (steps.ended()) return false;
+    if (!report) qv_log()->error("Can not get audio stream report");
+    if (!report && most < QvReportNeed::loudness) return true;
     const qvchain::SoundRange range{decoder, decoderStream, from, to};
     std::vector<AnyDict> reports(needs.size());
     for (std::size_t i = 0; i < needs.size(); ++i) {
@@ -122,12 +145,16 @@ void QvProcessUtil::applyStreamReport(QvAProcessPipe* pipe, QvDecodePipe* decode
         if (needs[i] != QvReportNeed::none && report) levels.set("peakLeveldB", report->peakdB(from, to));
         // The filters before this one work with their reports already.
         std::string why;
-        if (needs[i] == QvReportNeed::loudness &&
-            !qvchain::measureBefore(*pipe, static_cast<int>(i), reports, {&range, 1}, levels, why))
+        const bool measured = needs[i] != QvReportNeed::loudness ||
+                              qvchain::measureBefore(*pipe, static_cast<int>(i), reports, {&range, 1},
+                                                     steps.next(), levels, why);
+        if (steps.ended()) return false;
+        if (!measured)
             qv_log()->error("Can not measure the loudness for filter %s: %s",
                             pipe->filter(static_cast<int>(i))->name(), why.c_str());
         if (!levels.empty()) giveReport(*pipe->filter(static_cast<int>(i)), levels);
     }
+    return true;
 }
 
 void QvProcessUtil::rescaleTimePoints(const AnyVector& in, const QvFramerate& fromRate,

@@ -7,12 +7,12 @@
 #pragma once
 
 #include "core/arch/api.h"
+#include "core/decode/qvdecoder.h"
 #include "core/value/any.h"
 #include "core/value/anycontainer.h"
 
 class MediaTime;
 class QvAProcessPipe;
-class QvDecodePipe;
 class QvEncodePipe;
 class QvFrame;
 class QvFramerate;
@@ -59,8 +59,10 @@ class QV_API QvProcessUtil {
     //   "samplePeakdB"        dBFS
     //   "rmsdB"               dBFS
     // The pipe is not open yet. What can't be measured is logged and left out.
-    static void applyStreamReport(QvAProcessPipe* pipe, QvDecodePipe* decoder, int decoderStream,
-                                  long long from, long long to);
+    // `watch` gets the part of all readings that is done; false if it ended them, and no further report is
+    // set.
+    static bool applyStreamReport(QvAProcessPipe* pipe, QvDecodePipe* decoder, int decoderStream,
+                                  long long from, long long to, const QvReadWatch& watch = {});
 
     // Frame numbers at one rate to another. The first element decides whether they are Int32 or Int64; `out`
     // stays as it was when `in` is empty.

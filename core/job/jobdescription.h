@@ -2,7 +2,9 @@
 #pragma once
 
 #include <memory>
+#include <string>
 
+#include "core/arch/api.h"
 #include "core/measure/qvgeometry.h"
 #include "core/value/anycontainer.h"
 
@@ -29,6 +31,18 @@ struct VideoJobDescription {
     std::shared_ptr<QvCancel> cancel;
 };
 
+// How well an audio chain converts where it does so by itself. The defaults are the plain conversions; a
+// chain whose converter does not know a value can't be built.
+struct QV_API AudioConversion {
+    std::string rateQuality = "standard";  // "quality" of `srconvert`: "standard", "high"
+    std::string dither = "none";           // of the last `aquant`: "none", "triangular"
+
+    AudioConversion() = default;
+    // Keys "rateQuality" and "dither"; what is absent or no text keeps its default.
+    explicit AudioConversion(const AnyDict& stored);
+    AnyDict stored() const;  // what differs from the defaults
+};
+
 struct AudioJobDescription {
     int inBitsPerSample = 0;
     int inSamplerate = 0;
@@ -40,4 +54,5 @@ struct AudioJobDescription {
     // such (mixed), or false for silence. Empty: channels go straight through.
     AnyVector connMatrix;
     AnyVector filters;  // stored audio filters
+    AudioConversion conversion;
 };

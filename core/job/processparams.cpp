@@ -93,6 +93,15 @@ void ProcessParams::setAudioChannelMap(const AnyVector& map) { set("audioChannel
 
 const AnyVector* ProcessParams::audioChannelMap() const { return vectorOf(*this, "audioChannelMap"); }
 
+void ProcessParams::setAudioConversion(const AudioConversion& conversion) {
+    set("audioConversion", conversion.stored());
+}
+
+std::optional<AudioConversion> ProcessParams::audioConversion() const {
+    const Any& stored = get("audioConversion");
+    return stored.isDict() ? std::optional<AudioConversion>(stored.asDict()) : std::nullopt;
+}
+
 void ProcessParams::setSmartRender(int mode) {
     constexpr int modes = 3;
     const bool known = mode >= 0 && mode < modes;

@@ -6,6 +6,7 @@
 
 #include "core/arch/api.h"
 #include "core/job/filtersstate.h"
+#include "core/job/jobdescription.h"
 #include "core/job/qualitystats.h"
 #include "core/measure/qvgeometry.h"
 #include "core/value/anycontainer.h"
@@ -56,6 +57,9 @@ class QV_API ProcessParams : public AnyDict {
     // The connection matrix of an audio link.
     void setAudioChannelMap(const AnyVector& map);
     const AnyVector* audioChannelMap() const;
+    // How the sound is converted: key "audioConversion".
+    void setAudioConversion(const AudioConversion& conversion);
+    std::optional<AudioConversion> audioConversion() const;
     // 0 off, 1 on, 2 passed on as it stands; others are logged and stored as 0.
     void setSmartRender(int mode);
     int smartRender() const;

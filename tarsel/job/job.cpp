@@ -36,6 +36,14 @@ int intParam(const QvDecodePipe& decoder, int type, int stream, const char* name
     return value.isInt32() ? value.asInt32() : 0;
 }
 
+// Filters of so many channels leave others silent, which no one means.
+void requireChannels(const AnyDict& filter, int channels) {
+    const std::string name = filter.getString("name", "");
+    const int most = makeAnyCodec(name, kAudioFilter)->getParam("_maxChannels").asInt32(channels);
+    if (channels > most)
+        throw failure(Msg::filterChannels, {name, std::to_string(channels), std::to_string(most)});
+}
+
 }  // namespace
 
 long long JobStream::bytes(long long units) const {
@@ -539,7 +547,10 @@ void Job::planSound(JobStream& stream) const {
     FiltersState state;
     for (const auto& spec : options_.effects.filters) {
         if (filterType(spec) != kAudio) continue;
-        state.appendFilter(spec.c_str(), filterState(spec));
+        const AnyDict filter = filterState(spec);
+        const int channels = intParam(decoder, stream.type, stream.decStream, "channels");
+        requireChannels(filter, filter.get("_front").isTrue() ? channels : stream.channels);
+        state.appendFilter(spec.c_str(), filter);
         stream.chain.push_back(spec);
     }
     if (!state.empty()) stream.params.setFilters(state);

@@ -30,9 +30,16 @@ class Job::Runner : public QvTranscoder {
     // The units are those of the first stream; for a report that comes on another thread.
     int cbProcess() override {
         if (stop_.load(std::memory_order_relaxed)) return 1;
+        began_.store(true, std::memory_order_relaxed);
         if (first_) units_.store(first_->outProcessed(), std::memory_order_relaxed);
         if (progress_.due()) progress_.update(state("running"));
         return 0;
+    }
+
+    // The sound is read once before the run, which makes two passes of it.
+    void cbMeasure(double part) override {
+        read_.store(part, std::memory_order_relaxed);
+        if (progress_.due()) progress_.update(readingState());
     }
 
     // Once all is linked.
@@ -44,7 +51,8 @@ class Job::Runner : public QvTranscoder {
     // From any thread, at any time of the run.
     void report() {
         const char* name = isPaused() ? "paused" : phase_.load();
-        progress_.report(stateAt(job_.streams_.front(), units_, name));
+        const bool reading = read_ >= 0 && !began_;
+        progress_.report(reading ? readingState() : stateAt(job_.streams_.front(), units_, name));
     }
 
     // The counts have to be taken before the links close.
@@ -115,7 +123,18 @@ class Job::Runner : public QvTranscoder {
         if (!first_) return {.state = name};
         return stateAt(job_.streams_.front(), first_->outProcessed(), name);
     }
-    static ProgressState stateAt(const JobStream& stream, long long processed, const char* name) {
+    ProgressState readingState() const {
+        ProgressState s{.part = read_, .state = "running"};
+        countPasses(s, 1);
+        return s;
+    }
+    void countPasses(ProgressState& state, int pass) const {
+        if (read_ < 0) return;
+        state.pass = pass;
+        state.passes = 2;
+        if (state.part >= 0) state.part = (state.part + pass - 1) / 2;
+    }
+    ProgressState stateAt(const JobStream& stream, long long processed, const char* name) const {
         ProgressState s;
         s.state = name;
         const long long units = std::max(processed, 0LL);
@@ -124,6 +143,7 @@ class Job::Runner : public QvTranscoder {
         const double rate = stream.type == 1 ? static_cast<double>(stream.rate.rate()) : stream.samplerate;
         s.outSeconds = static_cast<double>(units) / rate;
         if (stream.type == 1) s.frame = units;
+        countPasses(s, 2);
         return s;
     }
     const ProgressState& last() const { return last_; }
@@ -159,6 +179,8 @@ class Job::Runner : public QvTranscoder {
     const TransLink* first_ = nullptr;  // of the first stream
     std::atomic<long long> units_{0};
     std::atomic<const char*> phase_{"running"};
+    std::atomic<double> read_{-1};  // part of the sound that was measured; negative without
+    std::atomic<bool> began_{false};
     ProgressState last_;
     std::optional<Failure> filterFailure_;
     std::atomic<bool> stop_{false};

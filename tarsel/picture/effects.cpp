@@ -77,7 +77,8 @@ void addEffectOptions(Command& command, EffectOptions& options) {
     command.option("--fade", options.fade, "Fade in from black over IN, and to black over OUT, or IN as well",
                    "IN[,OUT]");
     command.group("");
-    command.list("--filter", options.filters,
-                 "Any filter, see 'tarsel modules'; \\, and \\\\ stand for , and \\ in a value",
-                 "NAME[:K=V,...]");
+    command.list(
+        "--filter", options.filters,
+        "Any filter, see 'tarsel modules'; \\, and \\\\ stand for , and \\ in a value, lists are JSON",
+        "NAME[:K=V,...]");
 }

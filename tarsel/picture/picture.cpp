@@ -10,6 +10,7 @@
 #include "tarsel/picture/overlays.h"
 #include "tarsel/picture/sizes.h"
 #include "tarsel/words/keyvalues.h"
+#include "tarsel/words/listvalue.h"
 #include "tarsel/words/messages.h"
 #include "tarsel/words/rawnames.h"
 #include "tarsel/words/timespec.h"
@@ -47,6 +48,8 @@ Any valueOf(const std::string& text) {
 
 // Text of digits may be meant as text.
 void setGuessed(QvCodec& filter, const std::string& key, const std::string& text, const std::string& option) {
+    if (filter.getParam(key.c_str()).isVector())
+        return setChecked(filter, key, parseList(text, option + " " + key), option);
     const Any value = valueOf(text);
     if (!value.isText() && filter.getParam(key.c_str()).isText()) {
         try {

@@ -2,14 +2,24 @@
 
 #include <algorithm>
 
+#include "tarsel/words/listvalue.h"
 #include "tarsel/words/messages.h"
 
 namespace {
 
-// The text up to a comma, which goes as well. A backslash takes the meaning from what follows it.
+// The text up to a comma, which goes as well. A backslash takes the meaning from what follows it, and a list
+// as the value is taken whole.
 std::string takePart(std::string_view& text) {
     std::string part;
     while (!text.empty()) {
+        if (!part.empty() && part.find('=') == part.size() - 1) {
+            std::string_view list = text.substr(0, listLength(text));
+            if (list.find("\\,") != std::string_view::npos)
+                list = {};  // a name with brackets, written as ever
+            part += list;
+            text.remove_prefix(list.size());
+            if (text.empty()) break;
+        }
         const char c = text[0];
         const bool escaped = c == '\\' && text.size() > 1 && (text[1] == ',' || text[1] == '\\');
         text.remove_prefix(1);

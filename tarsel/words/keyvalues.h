@@ -1,5 +1,5 @@
 // "key=value,key=value" as in "testgen:size=1280x720,rate=25" and "scaler:kind=2". A backslash before a comma
-// or a backslash makes it a part of the value.
+// or a backslash makes it a part of the value; so is all of a list, "key=[1,2],key=value".
 #pragma once
 
 #include <string>

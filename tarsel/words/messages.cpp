@@ -25,6 +25,7 @@ constexpr Message kMessages[] = {
     {Msg::keyNotPair,       Exit::usage, "{option}",                       "{name} is not of the form key=value",                      "write key=value,key=value"},
     {Msg::keyUnknown,       Exit::usage, "{option}",                       "unknown key {name}",                                       "{hint}the keys are {text}"},
     {Msg::keyRepeated,      Exit::usage, "{option}",                       "the key {name} is given twice, and only one value counts", "leave one out"},
+    {Msg::listWrong,        Exit::usage, "{option}",                       "{name} is no list",                                        "give a JSON array; 'tarsel modules' says what is in it"},
     // values of options
     {Msg::timeWrong,        Exit::usage, "{option}", "{name} is not a time",                                  "use SS[.mmm], MM:SS, HH:MM:SS[.mmm], 120f, HH:MM:SS:FF or HH:MM:SS;FF"},
     {Msg::timeCountsFrames, Exit::usage, "{option}", "{name} counts frames, but the input has no frame rate", "give seconds"},
@@ -126,6 +127,7 @@ constexpr Message kMessages[] = {
     // filters and modules
     {Msg::filterUnknown,     Exit::module, "--filter",                               "there is no filter {name}",                             "{hint}'tarsel modules' lists all"},
     {Msg::filterNoStream,    Exit::usage,  "--filter {text}",                        "this job has no {text}",                                "leave it out"},
+    {Msg::filterChannels,    Exit::usage,  "--filter {text}",                        "the sound has {text} channels, and it works on {text}", "take fewer with --channels"},
     {Msg::effectNoPicture,   Exit::usage,  "{option}",                               "this job has no picture",                               "leave it out"},
     {Msg::filterPlaceTaken,  Exit::usage,  "--filter {text}",                        "its one place in the chain is taken by another option", "leave one out"},
     {Msg::filterFileMissing, Exit::usage,  "--filter {text}",                        "it writes a file, and none is named",                   "give it with filename=FILE"},

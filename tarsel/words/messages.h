@@ -25,6 +25,7 @@ enum class Msg : unsigned char {
     keyNotPair,
     keyUnknown,
     keyRepeated,
+    listWrong,
     // values of options
     timeWrong,
     timeCountsFrames,
@@ -126,6 +127,7 @@ enum class Msg : unsigned char {
     // filters and modules
     filterUnknown,
     filterNoStream,
+    filterChannels,
     effectNoPicture,
     filterPlaceTaken,
     filterFileMissing,

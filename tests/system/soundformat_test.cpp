@@ -64,4 +64,48 @@ TEST_F(SoundFormat, LevelsFollowTheFilter) {
           {"'dither' takes none or triangular"});
 }
 
+TEST_F(SoundFormat, ListsAreGivenInJson) {
+    makeWav("take.wav", 4800, 2, 16, 48000);
+    const std::vector<int> in = values("take.wav", 2);
+    const auto run = [&](const std::string& filter) {
+        works({"transcode", "take.wav", "--filter", filter, "-o", "out.wav", "-y"});
+        return values("out.wav", 2);
+    };
+    std::vector<int> wanted = in;
+    for (size_t i = 0; i < wanted.size(); i += 2) {
+        const double level = 100 - 50.0 * static_cast<double>(i / 2) / 4800;
+        wanted[i] = static_cast<int>(wanted[i] * 256 * (level / 100)) >> 8;
+        wanted[i + 1] = 0;
+    }
+    EXPECT_EQ(run(R"(audiolevel:volume_list_0=[{"time": 0, "volume":100},{"time":0.1,"volume":50}],)"
+                  R"(volume_list_1=[{"time":0,"volume":0}])"),
+              wanted);
+    for (size_t i = 0; i < wanted.size(); ++i) wanted[i] = in[i ^ 1];
+    EXPECT_EQ(run("chconvert:connMatrix=[1,[0]],_front=1"), wanted);
+    for (const auto& [value, says] : {std::pair{"5", "'5' is no list; give a JSON array"},
+                                      {"[1,2", "is not of the form key=value"},
+                                      {"[1", "'[1' is no list"},
+                                      {"{}", "'{}' is no list"},
+                                      {"[7]", R"(a point has a "time" in seconds)"}})
+        fails(2,
+              {"transcode", "take.wav", "--filter", std::string("audiolevel:volume_list_0=") + value, "-o",
+               "no.wav"},
+              {says});
+    fails(3, {"transcode", "testgen:duration=0.1", "--filter", "logo:filename=[a\\,b].png", "-o", "no.yuv"},
+          {"[a,b].png"});
+    const std::string deep = std::string(40, '[') + std::string(40, ']');
+    fails(2, {"transcode", "take.wav", "--filter", "chconvert:connMatrix=" + deep, "-o", "no.wav"},
+          {"is no list"});
+}
+
+// The sound is read twice, and the progress counts both.
+TEST_F(SoundFormat, MeasuringIsAPass) {
+    makeWav("take.wav", 480000, 2, 16, 48000);
+    const Outcome o =
+        works({"transcode", "take.wav", "--filter", "normalizer", "--progress", "json", "-o", "out.wav"});
+    EXPECT_THAT(o.err, testing::HasSubstr("\"passes\":2"));
+    const Outcome plain = works({"transcode", "take.wav", "--progress", "json", "-o", "plain.wav"});
+    EXPECT_THAT(plain.err, testing::Not(testing::HasSubstr("\"passes\":2")));
+}
+
 }  // namespace

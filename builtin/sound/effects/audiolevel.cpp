@@ -5,7 +5,7 @@
 #include <utility>
 
 #include "builtin/creators.h"
-#include "builtin/sound/effects/soundvalues.h"
+#include "builtin/sound/soundvalues.h"
 #include "core/engine/log/qvlog.h"
 #include "core/measure/qvgeometry.h"
 
@@ -56,9 +56,9 @@ AnyVector CustomAudioVolume::list(int channel) const {
 int CustomAudioVolume::write(QvPcm& pcm) {
     int* to = nullptr;
     if (const int result = begin(pcm, pcm.channels(), to)) return result;
-    const int channels = std::min(pcm.channels(), maxChannels);
+    const int channels = std::min(pcm.channels(), curveChannels);
     const bool unchanged =
-        pcm.channels() <= maxChannels &&
+        pcm.channels() <= curveChannels &&
         std::all_of(curves_.begin(), curves_.begin() + channels, [](const auto& c) { return c.empty(); });
     if (to && unchanged)
         std::memcpy(to, pcm.ptr(0), static_cast<std::size_t>(pcm.bytes()));

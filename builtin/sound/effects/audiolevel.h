@@ -20,5 +20,5 @@ class CustomAudioVolume : public CurveFilter {
   private:
     void applyCurve(const QvPcm& pcm, int channel, int* to) const;
 
-    std::array<LevelCurve, maxChannels> curves_;
+    std::array<LevelCurve, curveChannels> curves_;
 };

@@ -4,14 +4,12 @@
 #include <cmath>
 #include <cstring>
 
-#include "core/arch/qvassert.h"
 #include "core/engine/log/qvlog.h"
 #include "core/filter/qvprocessutil.h"
 #include "core/measure/qvgeometry.h"
 
 namespace {
 
-constexpr int workBytes = 4;
 constexpr const char* label = "volume list";
 constexpr double maxSeconds = 1e12;  // of a point; far from where differences of times overflow
 
@@ -28,7 +26,7 @@ CurveFilter::CurveFilter(Rows rows) : SoundFilter("custom avol::writepcm"), rows
 int CurveFilter::init() {
     if (const int result = SoundFilter::init()) return result;
     const char* why = nullptr;
-    for (int channel = 0; channel < maxChannels; ++channel) setList(channel, AnyVector(), why);
+    for (int channel = 0; channel < curveChannels; ++channel) setList(channel, AnyVector(), why);
     return QvStatus::ok;
 }
 
@@ -36,7 +34,6 @@ int CurveFilter::open() {
     if (const int result = SoundFilter::open()) return result;
     qv_dbg()->info("Opening audio volume module");
     position_ = 0;
-    warned_ = false;
     return QvStatus::ok;
 }
 
@@ -71,7 +68,7 @@ void CurveFilter::getParam(const char* name, Any& value) const {
 
 void CurveFilter::store(AnyDict& dict) const {
     SoundFilter::store(dict);
-    for (int channel = 0; channel < maxChannels; ++channel)
+    for (int channel = 0; channel < curveChannels; ++channel)
         dict.set(rows_[static_cast<std::size_t>(channel)].name, list(channel));
 }
 
@@ -98,17 +95,10 @@ AnyDict CurveFilter::describePoint(const LevelCurve::Point& point) {
 }
 
 int CurveFilter::begin(const QvPcm& pcm, int channels, int*& room) {
-    requireOpened();
-    QV_ASSERT_MSG(pcm.bytesPerSample() == workBytes, "Only 32 bit samples supported");
-    if (!warned_ && channels > maxChannels) {
-        qv_log()->warning("%s: only the first %d of %d channels are written, the others are silent", name(),
-                          maxChannels, channels);
-        warned_ = true;
-    }
-    unsigned char* bytes = nullptr;
-    const int result = makeRoom({pcm.samplerate(), channels, workBytes * 8}, pcm.samples(), bytes);
-    if (bytes) std::memset(bytes, 0, static_cast<std::size_t>(output_.samples2bytes(pcm.samples())));
-    room = reinterpret_cast<int*>(bytes);
+    requireWide(pcm);
+    warnOfSilence(channels);
+    const int result = makeWideRoom(pcm, channels, room);
+    if (room) std::memset(room, 0, static_cast<std::size_t>(output_.samples2bytes(pcm.samples())));
     return result;
 }
 

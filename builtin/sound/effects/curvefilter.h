@@ -10,9 +10,9 @@
 
 class CurveFilter : public SoundFilter {
   public:
-    static constexpr int maxChannels = 8;
+    static constexpr int curveChannels = 8;
     struct Settings {};  // the lists are set by hand
-    using Rows = std::span<const QvParamRow<Settings>, maxChannels>;
+    using Rows = std::span<const QvParamRow<Settings>, curveChannels>;
 
     int init() override;
     int open() override;
@@ -34,6 +34,8 @@ class CurveFilter : public SoundFilter {
     virtual bool setList(int channel, const AnyVector& list, const char*& why) = 0;
     virtual AnyVector list(int channel) const = 0;
 
+    int maxChannels() const override { return curveChannels; }
+
     static bool readPoint(const Any& entry, LevelCurve::Point& point);
     static AnyDict describePoint(const LevelCurve::Point& point);
 
@@ -49,5 +51,4 @@ class CurveFilter : public SoundFilter {
   private:
     const Rows rows_;
     long long position_ = 0;
-    bool warned_ = false;
 };

@@ -3,7 +3,7 @@
 #include <cstring>
 
 #include "builtin/creators.h"
-#include "builtin/sound/effects/soundvalues.h"
+#include "builtin/sound/soundvalues.h"
 #include "core/engine/log/qvlog.h"
 #include "core/filter/qvprocessutil.h"
 #include "core/measure/qvgeometry.h"
@@ -14,7 +14,6 @@ using Settings = DynamicsSettings;
 
 constexpr auto stateOpen = static_cast<QvCodec::State>(3);
 constexpr int workBytes = 4;
-constexpr const char* tag = "dynamics::writepcm";
 
 // Wider than what a user interface offers, and narrow enough that all arithmetic stays finite.
 constexpr double lowestLevel = -200, highestLevel = 100;
@@ -57,6 +56,8 @@ constexpr QvParamRow<Settings> rows[] = {
     level("noisegateLevel", &Settings::noisegateLevel, "below full scale"),
     attack("noisegateAttack", &Settings::noisegateAttack),
     release("noisegateRelease", &Settings::noisegateRelease),
+    {.name = "_channels", .member = &Settings::channels, .min = 0,
+     .help = "channels of the sound that is to come; 0: not known before it comes"},
     {.name = "peakLeveldB", .member = &Settings::peakdB, .flags = qvParamReadOnly, .unit = "dB",
      .help = "peak of the input, from the last report"},
     {.name = "peakLevel", .member = &Settings::peak, .flags = qvParamReadOnly,
@@ -98,7 +99,7 @@ AnyVector paramSet() {
 
 QvCodec* newDynamics() { return new Dynamics; }
 
-Dynamics::Dynamics() : SoundFilter(tag) {}
+Dynamics::Dynamics() : SoundFilter("dynamics::writepcm") {}
 
 int Dynamics::init() {
     if (getState() == stateInitialised) return setError(QvStatus::failed, "Already initialized");
@@ -110,8 +111,15 @@ int Dynamics::init() {
     return QvStatus::ok;
 }
 
+int Dynamics::checkChannels(int channels) {
+    if (channels <= maxChannels()) return QvStatus::ok;
+    return setError(QvStatus::failed, "dynamics works on up to %d channels, the sound has %d", maxChannels(),
+                    channels);
+}
+
 int Dynamics::open() {
     if (getState() != stateInitialised) return setError(QvStatus::failed, "Not initialized, or already open");
+    if (const int result = checkChannels(settings_.channels)) return result;
     setState(stateOpen);
     return QvStatus::ok;
 }
@@ -177,29 +185,20 @@ std::array<Dynamics::Stage, Dynamics::stageCount> Dynamics::prepare(int samplera
         stage(s.noisegate, s.noisegateLevel, s.noisegateAttack, s.noisegateRelease)};
 }
 
-// Room for all samples of `like` at the end of a buffer, which a change of format empties.
+// Room for all samples of `like` at the end of a buffer. One that is empty may change its channels.
 int Dynamics::append(QvPcm& buffer, const QvPcm& like, int*& room) {
-    const int count = like.samples();
-    const bool fits = buffer.inited() && buffer.channels() == like.channels();
-    if (!fits && buffer.inited() && buffer.samples() > 0)
-        return setError(QvStatus::failed, "[%s]the format of the sound has changed", tag);
-    int result = QvStatus::ok;
-    if (!fits) result = buffer.init(count, like.channels(), workBytes, like.samplerate());
-    const int missing = result == QvStatus::ok ? buffer.samples() + count - buffer.size() : 0;
-    if (result != QvStatus::ok || (missing > 0 && buffer.grow(missing) < 0))
-        return setError(QvStatus::outOfMemory, "[%s]failed to allocate space for %d samples", tag, count);
-    const int filled = buffer.samples();
-    buffer.setSamples(filled + count);
-    room = count > 0 ? reinterpret_cast<int*>(buffer.ptr(filled)) : nullptr;
-    return QvStatus::ok;
+    if (buffer.inited() && buffer.samples() == 0 && buffer.channels() != like.channels()) buffer.destroy();
+    unsigned char* bytes = nullptr;
+    const int result =
+        makeRoom(buffer, {like.samplerate(), like.channels(), workBytes * 8}, like.samples(), bytes);
+    room = reinterpret_cast<int*>(bytes);
+    return result;
 }
 
 int Dynamics::write(QvPcm& pcm) {
     if (!opened()) return setError(QvStatus::failed, "Not opened");
     if (pcm.bytesPerSample() != workBytes) return setError(QvStatus::failed, "Only 32 bit samples supported");
-    if (pcm.channels() > dynamics::maxChannels)
-        return setError(QvStatus::failed, "dynamics works on up to %d channels, the sound has %d",
-                        dynamics::maxChannels, pcm.channels());
+    if (const int result = checkChannels(pcm.channels())) return result;
     if (pcm.samplerate() < 1) return setError(QvStatus::failed, "The sound has no sample rate");
     const auto stages = prepare(pcm.samplerate());
     const QvPcm* from = &pcm;

@@ -1,5 +1,6 @@
 // Module `dynamics`: limiter, compressor, expander and noise gate, one after the other, each of which can be
-// off. Samples are 32 bits wide, of up to eight channels; a sound with more is refused by write.
+// off. Samples are 32 bits wide, of up to eight channels; a sound with more is refused by open, where
+// the chain has set "_channels", or by write.
 //
 // Attack times are in microseconds, release times in milliseconds. Each stage reads the whole buffer of the
 // one before, so the reader has to erase all that it has taken before the next write.
@@ -16,6 +17,7 @@ struct DynamicsSettings {
     double compressorRatio = 3, expanderRatio = 3;
     double limiterAttack = 1, compressorAttack = 1, expanderAttack = 1, noisegateAttack = 1;
     double limiterRelease = 1000, compressorRelease = 1000, expanderRelease = 1000, noisegateRelease = 1000;
+    int channels = 0;   // of the sound, 0: not known
     double peakdB = 0;  // of the input, as reported; no stage reads it
     double peak = 0;    // the same as an amplitude
 };
@@ -49,6 +51,8 @@ class Dynamics : public SoundFilter {
         dynamics::Work work;
     };
     std::array<Stage, stageCount> prepare(int samplerate) const;
+    int maxChannels() const override { return dynamics::maxChannels; }
+    int checkChannels(int channels);
     int takeReport(const Any& report);
     int append(QvPcm& buffer, const QvPcm& like, int*& room);
 

@@ -5,7 +5,7 @@
 #include <cmath>
 #include <cstddef>
 
-#include "builtin/sound/effects/soundvalues.h"
+#include "builtin/sound/soundvalues.h"
 
 namespace {
 

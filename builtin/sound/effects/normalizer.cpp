@@ -7,7 +7,8 @@
 #include <cstring>
 
 #include "builtin/creators.h"
-#include "builtin/sound/effects/soundvalues.h"
+#include "builtin/sound/soundvalues.h"
+#include "builtin/sound/wordparam.h"
 #include "core/engine/log/qvlog.h"
 #include "core/measure/qvgeometry.h"
 
@@ -16,7 +17,6 @@ namespace {
 using Settings = NormalizerSettings;
 using Mode = Settings::Mode;
 
-constexpr int workBytes = 4;
 // What is quieter, in dB below full scale, is silence: lifting it would only lift the noise.
 constexpr double silenceLevel = -90;
 
@@ -34,18 +34,7 @@ constexpr std::array<ModeRow, 3> modes = {{
 
 const ModeRow& rowOf(Mode mode) { return modes[static_cast<std::size_t>(mode)]; }
 
-int setMode(Settings& settings, const Any& value) {
-    std::string name;
-    if (!qvparam::convert(value, name)) return QvStatus::invalidParam;
-    for (std::size_t i = 0; i < modes.size(); ++i) {
-        if (name != modes[i].name) continue;
-        settings.mode = static_cast<Mode>(i);
-        return QvStatus::ok;
-    }
-    return QvStatus::invalidParam;
-}
-
-void getMode(const Settings& settings, Any& value) { value = rowOf(settings.mode).name; }
+constexpr std::array modeNames{modes[0].name, modes[1].name, modes[2].name};
 
 constexpr double lowestTarget = -90, highestTarget = 20;
 
@@ -63,8 +52,8 @@ void getTarget(const Settings& settings, Any& value) { value = targetOf(settings
 
 // clang-format off
 constexpr QvParamRow<Settings> rows[] = {
-    {.name = "mode", .member = QvParamAccess<Settings>{setMode, getMode}, .flags = qvParamStored,
-     .help = "what becomes equal to `target`: `peak` (the highest sample), `rms` or `loudness` (EBU R 128)"},
+    {.name = "mode", .member = wordParam<Settings, &Settings::mode, modeNames>, .flags = qvParamStored,
+     .help = "peak (the highest sample), rms or loudness (EBU R 128): what becomes equal to target"},
     {.name = "target", .member = QvParamAccess<Settings>{setTarget, getTarget}, .flags = qvParamStored,
      .min = lowestTarget, .max = highestTarget, .unit = "dBFS, LUFS",
      .help = "the level to reach; if it is not set, -3 dBFS for peak, -20 dBFS for rms, -23 LUFS for loudness"},
@@ -86,7 +75,7 @@ double rounded(double value) {
 
 QvCodec* newNormalizer() { return new QvNormalizer; }
 
-QvNormalizer::QvNormalizer() : SoundFilterOf("normalizer::writepcm", rows) {}
+QvNormalizer::QvNormalizer() : StoredFilterOf("normalizer::writepcm", rows) {}
 
 int QvNormalizer::setParam(const char* name, const Any& value) {
     if (std::strcmp(name, "_streamReport") == 0) {
@@ -95,32 +84,27 @@ int QvNormalizer::setParam(const char* name, const Any& value) {
         report_ = value.asDict();
         return QvStatus::ok;
     }
-    const int result = SoundFilterOf::setParam(name, value);
-    if (result != QvStatus::ok && std::strcmp(name, "mode") == 0)
-        return setError(result, "'mode' is 'peak', 'rms' or 'loudness'");
-    return result;
+    return StoredFilterOf::setParam(name, value);
 }
 
 void QvNormalizer::getParam(const char* name, Any& value) const {
     if (std::strcmp(name, "_needsReport") == 0)
         value = QvReportNeed::loudness;
     else
-        SoundFilterOf::getParam(name, value);
+        StoredFilterOf::getParam(name, value);
 }
 
+// Whether there is a target matters, not whether it differs from the default of some mode.
 void QvNormalizer::store(AnyDict& dict) const {
-    SoundFilterOf::store(dict);
-    qvStoreParamRows<Settings>(rows_, settings_, dict);
-    if (!settings_.target) dict.remove("target");
-}
-
-int QvNormalizer::restore(const AnyDict& dict) {
-    if (const int result = SoundFilterOf::restore(dict)) return result;
-    return _restoreRows<Settings>(rows_, settings_, dict);
+    StoredFilterOf::store(dict);
+    if (settings_.target)
+        dict.set("target", *settings_.target);
+    else
+        dict.remove("target");
 }
 
 int QvNormalizer::open() {
-    if (const int result = SoundFilterOf::open()) return result;
+    if (const int result = StoredFilterOf::open()) return result;
     settings_.gain = chooseGain();
     factor_ = std::pow(10.0, settings_.gain / 20);
     qv_dbg()->info("Opening normalizer, gain is %.2f dB", settings_.gain);
@@ -150,19 +134,15 @@ double QvNormalizer::chooseGain() const {
 }
 
 int QvNormalizer::write(QvPcm& pcm) {
-    requireOpened();
-    if (pcm.bytesPerSample() != workBytes) return setError(QvStatus::failed, "Only 32 bit samples supported");
-    unsigned char* room = nullptr;
-    const QvPcmFormat format{pcm.samplerate(), pcm.channels(), workBytes * 8};
-    if (const int result = makeRoom(format, pcm.samples(), room)) return result;
+    requireWide(pcm);
+    int* room = nullptr;
+    if (const int result = makeWideRoom(pcm, pcm.channels(), room)) return result;
     if (room && factor_ == 1.0) {
         std::memcpy(room, pcm.ptr(0), static_cast<std::size_t>(pcm.bytes()));
     } else if (room) {
         const int* from = soundValues(pcm);
-        int* to = reinterpret_cast<int*>(room);
         const auto count = static_cast<std::size_t>(pcm.samples()) * static_cast<std::size_t>(pcm.channels());
-        for (std::size_t i = 0; i < count; ++i)
-            to[i] = static_cast<int>(std::clamp<double>(rounded(from[i] * factor_), INT_MIN, INT_MAX));
+        for (std::size_t i = 0; i < count; ++i) room[i] = saturated(rounded(from[i] * factor_));
     }
     output_.copyMeta(pcm);
     return QvStatus::ok;

@@ -9,7 +9,7 @@
 #include <optional>
 #include <string>
 
-#include "builtin/sound/soundfilter.h"
+#include "builtin/sound/storedfilter.h"
 
 // The default target of the peak leaves room for true peaks above it, so that the gain is rarely lowered.
 struct NormalizerSettings {
@@ -21,7 +21,7 @@ struct NormalizerSettings {
     double gain = 0;               // dB, of the last open
 };
 
-class QvNormalizer : public SoundFilterOf<NormalizerSettings> {
+class QvNormalizer : public StoredFilterOf<NormalizerSettings> {
   public:
     QvNormalizer();
 
@@ -31,10 +31,9 @@ class QvNormalizer : public SoundFilterOf<NormalizerSettings> {
     // Beside the rows "_needsReport".
     void getParam(const char* name, Any& value) const override;
     void store(AnyDict& dict) const override;
-    int restore(const AnyDict& dict) override;
     int write(QvPcm& pcm) override;
 
-    using SoundFilterOf::getParam;
+    using StoredFilterOf::getParam;
 
   private:
     double chooseGain() const;  // dB

@@ -5,7 +5,7 @@
 #include <vector>
 
 #include "builtin/creators.h"
-#include "builtin/sound/effects/soundvalues.h"
+#include "builtin/sound/soundvalues.h"
 #include "core/measure/qvgeometry.h"
 
 namespace {
@@ -46,7 +46,7 @@ int CAudioPanning::init() {
 }
 
 bool CAudioPanning::setList(int channel, const AnyVector& list, const char*& why) {
-    std::array<std::vector<LevelCurve::Point>, maxChannels> points;
+    std::array<std::vector<LevelCurve::Point>, curveChannels> points;
     for (int i = 0; i < list.size(); ++i) {
         LevelCurve::Point point;
         int output = 0;
@@ -54,11 +54,11 @@ bool CAudioPanning::setList(int channel, const AnyVector& list, const char*& why
             "a point has an \"out_ch\" from 0 to 7, a \"time\" in seconds and an integer \"volume\" in "
             "percent";
         if (!readPoint(list.at(i), point) || !qvparam::convert(list.at(i).asDict().get("out_ch"), output) ||
-            output < 0 || output >= maxChannels)
+            output < 0 || output >= curveChannels)
             return false;
         at(points, output).push_back(point);
     }
-    for (int output = 0; output < maxChannels; ++output) {
+    for (int output = 0; output < curveChannels; ++output) {
         if (!at(points, output).empty()) highest_ = std::max(highest_, output);
         at(at(curves_, channel), output) = LevelCurve(std::move(at(points, output)));
     }
@@ -81,7 +81,7 @@ int CAudioPanning::write(QvPcm& pcm) {
     const int outputs = std::max(pcm.channels(), highest_ + 1);
     int* to = nullptr;
     if (const int result = begin(pcm, outputs, to)) return result;
-    for (int output = 0; to && output < std::min(outputs, maxChannels); ++output) {
+    for (int output = 0; to && output < std::min(outputs, curveChannels); ++output) {
         Mix mix = sourcesOf(output, pcm);
         if (mix.count > 0) mixOutput(mix, pcm, to + output, outputs);
     }
@@ -91,7 +91,7 @@ int CAudioPanning::write(QvPcm& pcm) {
 
 CAudioPanning::Mix CAudioPanning::sourcesOf(int output, const QvPcm& pcm) const {
     Mix mix;
-    for (int input = 0; input < std::min(pcm.channels(), maxChannels); ++input) {
+    for (int input = 0; input < std::min(pcm.channels(), curveChannels); ++input) {
         const LevelCurve& curve = at(at(curves_, input), output);
         if (!curve.empty())
             at(mix.sources, mix.count++) = {LevelCurve::Walk(curve, secondsAt(pcm, 0)), input};

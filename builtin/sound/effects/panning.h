@@ -20,7 +20,7 @@ class CAudioPanning : public CurveFilter {
     AnyVector list(int channel) const override;
 
   private:
-    using Curves = std::array<LevelCurve, maxChannels>;  // by output channel
+    using Curves = std::array<LevelCurve, curveChannels>;  // by output channel
 
     // A curve with points while it is read, of an input channel that there is.
     struct Source {
@@ -28,12 +28,12 @@ class CAudioPanning : public CurveFilter {
         int from;
     };
     struct Mix {
-        std::array<Source, maxChannels> sources;
+        std::array<Source, curveChannels> sources;
         int count = 0;
     };
     Mix sourcesOf(int output, const QvPcm& pcm) const;
     void mixOutput(Mix& mix, const QvPcm& pcm, int* to, int step) const;
 
-    std::array<Curves, maxChannels> curves_;  // by input channel
-    int highest_ = 0;                         // output channel that any list has named since init
+    std::array<Curves, curveChannels> curves_;  // by input channel
+    int highest_ = 0;                           // output channel that any list has named since init
 };

@@ -6,7 +6,7 @@
 
 #include "builtin/creators.h"
 #include "builtin/sound/format/soundrows.h"
-#include "builtin/sound/format/wordparam.h"
+#include "builtin/sound/wordparam.h"
 #include "core/arch/qvassert.h"
 
 namespace {
@@ -47,11 +47,11 @@ void widen(unsigned char* to, const QvPcm& pcm, size_t count) {
 
 QvCodec* newAquant() { return new QvAquant; }
 
-QvAquant::QvAquant() : FormatFilterOf("aquant::writepcm", rows) {}
+QvAquant::QvAquant() : StoredFilterOf("aquant::writepcm", rows) {}
 
 int QvAquant::init() {
     warnOnClip_ = true;
-    return FormatFilterOf::init();
+    return StoredFilterOf::init();
 }
 
 int QvAquant::open() {
@@ -62,7 +62,7 @@ int QvAquant::open() {
                         settings_.outBits);
     clipReported_ = false;
     ditherPlace_ = 0;
-    return FormatFilterOf::open();
+    return StoredFilterOf::open();
 }
 
 // True if a value was out of range.

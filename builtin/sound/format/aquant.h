@@ -9,7 +9,7 @@
 // Sound of the same width is copied. Values out of range take the nearest bound, with one warning per open.
 #pragma once
 
-#include "builtin/sound/format/formatfilter.h"
+#include "builtin/sound/storedfilter.h"
 
 struct AquantSettings {
     enum Dither { none, triangular };
@@ -18,7 +18,7 @@ struct AquantSettings {
     Dither dither = none;
 };
 
-class QvAquant : public FormatFilterOf<AquantSettings> {
+class QvAquant : public StoredFilterOf<AquantSettings> {
   public:
     QvAquant();
 

@@ -6,7 +6,7 @@
 
 #include "builtin/creators.h"
 #include "builtin/sound/format/soundrows.h"
-#include "core/arch/qvassert.h"
+#include "builtin/sound/soundvalues.h"
 #include "core/engine/modules/qvmodule.h"
 #include "core/filter/qvprocessutil.h"
 
@@ -93,17 +93,16 @@ AnyVector describeChannels() {
     return set;
 }
 
-constexpr int wideBytes = 4;
 constexpr size_t minPeriod = 256;  // values, so that loops over a period are long
 
 }  // namespace
 
 QvCodec* newAvol() { return new QvAVol; }
 
-QvAVol::QvAVol() : FormatFilterOf("avol::writepcm", rows) { computeGains(); }
+QvAVol::QvAVol() : StoredFilterOf("avol::writepcm", rows) { computeGains(); }
 
 int QvAVol::init() {
-    const int result = FormatFilterOf::init();
+    const int result = StoredFilterOf::init();
     computeGains();
     return result;
 }
@@ -114,7 +113,7 @@ void QvAVol::computeGains() {
 }
 
 int QvAVol::setParam(const char* name, const Any& value) {
-    const int result = FormatFilterOf::setParam(name, value);
+    const int result = StoredFilterOf::setParam(name, value);
     computeGains();
     return result;
 }
@@ -125,18 +124,18 @@ void QvAVol::getParam(const char* name, Any& value) const {
     else if (std::strcmp(name, "paramSet") == 0)
         value = describeChannels();
     else
-        FormatFilterOf::getParam(name, value);
+        StoredFilterOf::getParam(name, value);
 }
 
 void QvAVol::store(AnyDict& dict) const {
-    FormatFilterOf::store(dict);
+    StoredFilterOf::store(dict);
     dict.set("volume", settings_.volume);
     dict.set("mute", settings_.mute ? 1 : 0);
     dict.set("type", QvModuleType::audioFilter);
 }
 
 int QvAVol::restore(const AnyDict& dict) {
-    const int result = FormatFilterOf::restore(dict);
+    const int result = StoredFilterOf::restore(dict);
     computeGains();
     return result;
 }
@@ -154,9 +153,8 @@ int QvAVol::open() {
         else
             qv_dbg()->info("Channel %d gain: %fdB", i + 1, settings_.*channels[i].volume);
     }
-    silenceReported_ = false;
     computeGains();
-    return FormatFilterOf::open();
+    return StoredFilterOf::open();
 }
 
 void QvAVol::spreadGains(int count) {
@@ -169,22 +167,15 @@ void QvAVol::spreadGains(int count) {
 }
 
 int QvAVol::write(QvPcm& pcm) {
-    requireOpened();
+    requireWide(pcm);
     if (pcm.samples() < 1) return QvStatus::ok;
-    QV_ASSERT_MSG(pcm.bytesPerSample() == wideBytes, "Only 32 bit samples supported");
-    unsigned char* room = nullptr;
-    const QvPcmFormat format{pcm.samplerate(), pcm.channels(), wideBytes * 8};
-    if (const int result = makeRoom(format, pcm.samples(), room)) return result;
+    warnOfSilence(pcm.channels());
+    int32_t* room = nullptr;
+    if (const int result = makeWideRoom(pcm, pcm.channels(), room)) return result;
     output_.copyMeta(pcm);
     if (period_.empty()) spreadGains(pcm.channels());
     const auto apply = settings_.precision == coarse ? snd::gain5 : snd::gain16;
-    apply(reinterpret_cast<int32_t*>(room), reinterpret_cast<const int32_t*>(pcm.ptr(0)),
-          static_cast<size_t>(pcm.samples()) * static_cast<size_t>(pcm.channels()), period_.data(),
-          period_.size());
-    if (pcm.channels() > S::channels && !silenceReported_) {
-        silenceReported_ = true;
-        qv_log()->warning("The volume filter has gains for 8 channels: channels 9 to %d become silent",
-                          pcm.channels());
-    }
+    apply(room, soundValues(pcm), static_cast<size_t>(pcm.samples()) * static_cast<size_t>(pcm.channels()),
+          period_.data(), period_.size());
     return QvStatus::ok;
 }

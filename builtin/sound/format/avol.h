@@ -19,7 +19,7 @@
 #include <cstdint>
 #include <vector>
 
-#include "builtin/sound/format/formatfilter.h"
+#include "builtin/sound/storedfilter.h"
 
 struct AVolSettings {
     static constexpr int channels = 8;
@@ -34,7 +34,7 @@ struct AVolSettings {
     double peakLevel = 0;  // dB, of the stream report
 };
 
-class QvAVol : public FormatFilterOf<AVolSettings> {
+class QvAVol : public StoredFilterOf<AVolSettings> {
   public:
     QvAVol();
 
@@ -47,13 +47,13 @@ class QvAVol : public FormatFilterOf<AVolSettings> {
     int restore(const AnyDict& dict) override;
     int write(QvPcm& pcm) override;
 
-    using FormatFilterOf::getParam;
+    using StoredFilterOf::getParam;
 
   private:
+    int maxChannels() const override { return AVolSettings::channels; }
     void computeGains();
     void spreadGains(int channels);
 
     std::array<int32_t, AVolSettings::channels> gains_{};
     std::vector<int32_t> period_;  // the gains of several samples, value by value; empty: to be made
-    bool silenceReported_ = false;
 };

@@ -5,7 +5,7 @@
 #include <optional>
 
 #include "builtin/creators.h"
-#include "core/arch/qvassert.h"
+#include "builtin/sound/soundvalues.h"
 
 namespace {
 
@@ -20,8 +20,7 @@ constexpr QvParamRow<Settings> rows[] = {
 };
 static_assert(qvParamTableOk<Settings>(rows));
 
-constexpr int wideBytes = 4;
-constexpr int maxChannels = 16, maxSources = 16;
+constexpr int mostChannels = 16, mostSources = 16;
 
 bool isSilent(int channel) { return channel == -1 || channel == -2; }
 
@@ -29,7 +28,7 @@ bool isSilent(int channel) { return channel == -1 || channel == -2; }
 std::optional<std::vector<int>> sourcesOf(const Any& entry) {
     if (entry.isInt32() && isSilent(entry.asInt32())) return std::vector<int>();
     if (entry.isInt32() && entry.asInt32() >= 0) return std::vector<int>{entry.asInt32()};
-    if (!entry.isVector() || entry.asVector().size() > maxSources) return std::nullopt;
+    if (!entry.isVector() || entry.asVector().size() > mostSources) return std::nullopt;
     std::vector<int> sources;
     for (const Any& channel : entry.asVector()) {
         if (!channel.isInt32() || channel.asInt32() < 0) return std::nullopt;
@@ -86,15 +85,15 @@ void makeChannel(Out to, In from, const std::vector<int>& sources, size_t sample
 
 QvCodec* newChconvert() { return new ChConvert; }
 
-ChConvert::ChConvert() : FormatFilterOf("ChConvert::writepcm", rows) {}
+ChConvert::ChConvert() : StoredFilterOf("ChConvert::writepcm", rows) {}
 
 int ChConvert::readMatrix() {
     const AnyVector& matrix = settings_.matrix;
     sources_.clear();
     highest_ = -1;
-    if (matrix.empty() || matrix.size() > maxChannels)
+    if (matrix.empty() || matrix.size() > mostChannels)
         return setError(QvStatus::failed, "the channel matrix has %d output channels, not 1 to %d",
-                        matrix.size(), maxChannels);
+                        matrix.size(), mostChannels);
     for (int i = 0; i < matrix.size(); ++i) {
         const auto sources = sourcesOf(matrix.at(i));
         if (!sources)
@@ -102,7 +101,7 @@ int ChConvert::readMatrix() {
                 QvStatus::failed,
                 "the channel matrix has an invalid entry for output channel %d: a channel from 0 on, "
                 "-1 for silence, or at most %d channels whose mean it is",
-                i, maxSources);
+                i, mostSources);
         sources_.push_back(*sources);
         for (const int source : *sources) highest_ = std::max(highest_, source);
     }
@@ -112,29 +111,26 @@ int ChConvert::readMatrix() {
 int ChConvert::open() {
     requireInited();
     if (const int result = readMatrix()) return result;
-    return FormatFilterOf::open();
+    return StoredFilterOf::open();
 }
 
 int ChConvert::write(QvPcm& pcm) {
-    requireOpened();
+    requireWide(pcm);
     if (pcm.samples() < 1) return QvStatus::ok;
-    QV_ASSERT_MSG(pcm.bytesPerSample() == wideBytes, "Only 32 bit samples supported");
     if (highest_ >= pcm.channels())
         return setError(QvStatus::failed, "the channel matrix names input channel %d, but the sound has %d",
                         highest_, pcm.channels());
     const auto outChannels = static_cast<int>(sources_.size());
-    unsigned char* room = nullptr;
-    if (const int result = makeRoom({pcm.samplerate(), outChannels, wideBytes * 8}, pcm.samples(), room))
-        return result;
+    int32_t* room = nullptr;
+    if (const int result = makeWideRoom(pcm, outChannels, room)) return result;
     output_.copyMeta(pcm);
     const auto isEmpty = [](const Sources& sources) { return sources.empty(); };
     const bool silence = std::any_of(sources_.begin(), sources_.end(), isEmpty);
     constexpr int part = 1024;  // samples, which stay in the cache from channel to channel
     for (int at = 0; at < pcm.samples(); at += part) {
         const auto samples = static_cast<size_t>(std::min(part, pcm.samples() - at));
-        const In from{reinterpret_cast<const int32_t*>(pcm.ptr(at)), static_cast<size_t>(pcm.channels())};
-        Out to{reinterpret_cast<int32_t*>(room) + ptrdiff_t{at} * outChannels,
-               static_cast<size_t>(outChannels)};
+        const In from{soundValues(pcm, at), static_cast<size_t>(pcm.channels())};
+        Out to{room + ptrdiff_t{at} * outChannels, static_cast<size_t>(outChannels)};
         if (silence) std::memset(to.first, 0, samples * to.channels * sizeof(int32_t));
         for (const Sources& sources : sources_) {
             makeChannel(to, from, sources, samples);

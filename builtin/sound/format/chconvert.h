@@ -12,13 +12,13 @@
 
 #include <vector>
 
-#include "builtin/sound/format/formatfilter.h"
+#include "builtin/sound/storedfilter.h"
 
 struct ChConvertSettings {
     AnyVector matrix;
 };
 
-class ChConvert : public FormatFilterOf<ChConvertSettings> {
+class ChConvert : public StoredFilterOf<ChConvertSettings> {
   public:
     ChConvert();
 

@@ -9,7 +9,8 @@
 #include "builtin/sound/format/resampler.h"
 #include "builtin/sound/format/samplefifo.h"
 #include "builtin/sound/format/soxrrate.h"
-#include "builtin/sound/format/wordparam.h"
+#include "builtin/sound/soundvalues.h"
+#include "builtin/sound/wordparam.h"
 #include "core/arch/qvassert.h"
 
 namespace {
@@ -42,15 +43,11 @@ constexpr int wideBytes = 4;
 constexpr double spare = 1.02;  // room of the first output, as a share of what the input gives
 constexpr int maxBufferRate = 192000, assumedRate = 48000;
 
-const int32_t* valuesOf(const QvPcm& pcm, int sample = 0) {
-    return reinterpret_cast<const int32_t*>(pcm.ptr(sample));
-}
-
 }  // namespace
 
 QvCodec* newSrconvert() { return new QvSamplerate2; }
 
-QvSamplerate2::QvSamplerate2() : FormatFilterOf("srconvert::writepcm", rows) {}
+QvSamplerate2::QvSamplerate2() : StoredFilterOf("srconvert::writepcm", rows) {}
 
 QvSamplerate2::~QvSamplerate2() = default;
 
@@ -63,7 +60,7 @@ int QvSamplerate2::open() {
         return setError(QvStatus::failed, "the quality 'high' needs libsoxr, which this build does not have");
     qv_dbg()->info("Opening samplerate converter, %d->%d", settings_.inRate, settings_.outRate);
     samplesIn_ = samplesOut_ = 0;
-    return FormatFilterOf::open();
+    return StoredFilterOf::open();
 }
 
 int QvSamplerate2::close() {
@@ -73,7 +70,7 @@ int QvSamplerate2::close() {
     fifo_.reset();
     soxr_.reset();
     settings_.batch = Settings().batch;
-    return FormatFilterOf::close();
+    return StoredFilterOf::close();
 }
 
 int QvSamplerate2::missingInput() const {
@@ -89,7 +86,7 @@ void QvSamplerate2::getParam(const char* name, Any& value) const {
     if (std::strcmp(name, "splsNeed") == 0 && opened())
         value = missingInput();
     else
-        FormatFilterOf::getParam(name, value);
+        StoredFilterOf::getParam(name, value);
 }
 
 QvPcmFormat QvSamplerate2::outputFormat(const QvPcm& pcm) const {
@@ -187,7 +184,7 @@ int QvSamplerate2::writeStandard(const QvPcm& pcm) {
 
     long long made = 0;
     for (int at = 0; at < pcm.samples(); at += static_cast<int>(part)) {
-        fifo_->append(valuesOf(pcm, at), std::min<long long>(part, pcm.samples() - at));
+        fifo_->append(soundValues(pcm, at), std::min<long long>(part, pcm.samples() - at));
         made += makeBatches(reinterpret_cast<int32_t*>(room) + made * channels);
     }
     output_.setSamples(filled + static_cast<int>(made));
@@ -200,7 +197,7 @@ int QvSamplerate2::writeWhole(const QvPcm& pcm) {
     unsigned char* room = nullptr;
     if (!fifo_->reserve(fifo_->samples() + pcm.samples())) return noRoom(fifo_->samples() + pcm.samples());
     if (const int result = makeRoom(outputFormat(pcm), free, room)) return result;
-    fifo_->append(valuesOf(pcm), pcm.samples());
+    fifo_->append(soundValues(pcm), pcm.samples());
     const int made =
         resampler_->makeAll(fifo_->view(), fifo_->samples(), reinterpret_cast<int32_t*>(room), free);
     fifo_->drop(std::min(resampler_->consume(), fifo_->samples()));
@@ -215,7 +212,7 @@ int QvSamplerate2::writeHigh(const QvPcm& pcm) {
     if (most > INT_MAX) return noRoom(most);
     if (const int result = makeRoom(outputFormat(pcm), static_cast<int>(most), room)) return result;
     const long long made =
-        soxr_->process(valuesOf(pcm), pcm.samples(), reinterpret_cast<int32_t*>(room), most);
+        soxr_->process(soundValues(pcm), pcm.samples(), reinterpret_cast<int32_t*>(room), most);
     output_.setSamples(filled + static_cast<int>(std::max(made, 0LL)));
     return made < 0 ? setError(QvStatus::failed, "the samplerate converter of high quality failed")
                     : QvStatus::ok;

@@ -16,7 +16,7 @@
 
 #include <memory>
 
-#include "builtin/sound/format/formatfilter.h"
+#include "builtin/sound/storedfilter.h"
 
 namespace snd {
 class Resampler;
@@ -33,7 +33,7 @@ struct SrconvertSettings {
     Quality quality = standard;
 };
 
-class QvSamplerate2 : public FormatFilterOf<SrconvertSettings> {
+class QvSamplerate2 : public StoredFilterOf<SrconvertSettings> {
   public:
     QvSamplerate2();
     ~QvSamplerate2() override;
@@ -43,7 +43,7 @@ class QvSamplerate2 : public FormatFilterOf<SrconvertSettings> {
     void getParam(const char* name, Any& value) const override;
     int write(QvPcm& pcm) override;
 
-    using FormatFilterOf::getParam;
+    using StoredFilterOf::getParam;
 
   private:
     int noRoom(long long samples);

@@ -9,6 +9,7 @@ LinkOpen::LinkOpen(const AnyDict* params) {
     effects = params->getDict("effects");
     takeAudioEffects(params->getDict("audioEffects"));
     connMatrix = params->getVector("connMatrix");
+    conversion = AudioConversion(params->getDict("audioConversion"));
     qualityStats = params->getVector("qualityStats");
     smartRender = params->getInt32("smartRender", 0);
     passPicture = params->get("smartRender").isTrue();

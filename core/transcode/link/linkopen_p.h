@@ -3,13 +3,14 @@
 
 #include <optional>
 
+#include "core/job/jobdescription.h"
 #include "core/job/processparams.h"
 #include "core/value/anycontainer.h"
 
 struct LinkOpen {
     LinkOpen() = default;
-    // "inOutPoints", "chapters", "effects", "audioEffects", "connMatrix", "smartRender", "qualityStats"; what
-    // is absent or of another type counts as not given. Null gives nothing.
+    // "inOutPoints", "chapters", "effects", "audioEffects", "connMatrix", "audioConversion", "smartRender",
+    // "qualityStats"; what is absent or of another type counts as not given. Null gives nothing.
     explicit LinkOpen(const AnyDict* params);
     void takeAudioEffects(const AnyDict& filters);  // a FiltersState
 
@@ -19,6 +20,7 @@ struct LinkOpen {
     AnyDict effects;                    // a FiltersState
     AnyVector audioFilters;             // stored filters, in order
     AnyVector connMatrix;               // one entry an output channel; empty: not given
+    AudioConversion conversion;
     AnyVector qualityStats;
     // Sound has several modes and takes an Int32 alone; for a picture anything true is on.
     int smartRender = 0;

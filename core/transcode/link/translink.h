@@ -11,6 +11,7 @@
 #include <utility>
 
 #include "core/arch/api.h"
+#include "core/decode/qvdecoder.h"
 #include "core/job/processparams.h"
 #include "core/measure/qvgeometry.h"
 #include "core/measure/streamtype.h"
@@ -18,7 +19,6 @@
 
 class QvCancel;
 class QvCodec;
-class QvDecodePipe;
 class QvEncodePipe;
 class QvException;
 struct LinkOpen;
@@ -35,8 +35,8 @@ class QV_API TransLink {
     // -1 for an encoder stream that does not exist (video); misuse asserts.
     virtual int init(QvDecodePipe* decoder, int decStream, QvEncodePipe* encoder, int encStream);
     // Reads the formats, takes the points and builds the conversion. `params` (may be null): "inOutPoints",
-    // "chapters", "effects", "audioEffects", "connMatrix", "smartRender", "qualityStats". -1 when open
-    // already.
+    // "chapters", "effects", "audioEffects", "connMatrix", "audioConversion", "smartRender", "qualityStats".
+    // -1 when open already.
     virtual int open(const AnyDict* params);
     // Ends the run. A closed link is left alone: 0. Otherwise 0 or what a filter failed with since open, here
     // or before: filters let frames pass that they could not work on, and no step reports it.
@@ -82,6 +82,9 @@ class QV_API TransLink {
     const char* errorDesc() const;  // never null
     // Ends the waits of filters that are a QvCancellable; in force from the next open on. Null: nothing does.
     void setCancel(std::shared_ptr<QvCancel> cancel) { cancel_ = std::move(cancel); }
+    // Watches what `open` reads ahead for filters that need a report; false makes it fail. Empty: nothing
+    // does.
+    void setReadWatch(QvReadWatch watch) { readWatch_ = std::move(watch); }
     // Makes the encoder stream take the format of the decoder stream. -1 before init.
     int copyFormat();
 
@@ -111,6 +114,7 @@ class QV_API TransLink {
     ProcessParams processParams_;
     InOutPoints inOutPoints_;
     std::shared_ptr<QvCancel> cancel_;
+    QvReadWatch readWatch_;
     bool logProgress_ = false;
     Any errorDesc_;
     int errorCode_ = 0;

@@ -89,6 +89,7 @@ int PushEncoder::PushEncoder_p::openAudioLink() {
     const auto& process = queues.firstAudioProcess();
     if (const auto filters = process.filters()) open.takeAudioEffects(*filters);
     if (const auto* map = process.audioChannelMap()) open.connMatrix = *map;
+    if (const auto conversion = process.audioConversion()) open.conversion = *conversion;
     const int result = worker.audioLink().openWith(open);
     return result == QvStatus::ok ? result : setError(result, worker.audioLink().errorDesc());
 }
@@ -144,6 +145,8 @@ int QvPushEncoder::addAudioStream(AnyDict& params, ProcessParams* process) {
     if (process) {
         if (const auto filters = process->filters()) stream->process.setFilters(*filters);
         if (const auto* map = process->audioChannelMap()) stream->process.setAudioChannelMap(*map);
+        if (const auto conversion = process->audioConversion())
+            stream->process.setAudioConversion(*conversion);
     }
     const long long sampleBytes = static_cast<long long>(channels) * bytes;
     if (sampleBytes * length > INT32_MAX) return p_->setError(QvStatus::outOfMemory, "Out of memory");

@@ -91,6 +91,7 @@ int QvTranscoder::cbProgress(double) { return 0; }
 void QvTranscoder::cbPaused(bool paused) { qv_dbg()->debug("%s", paused ? "PAUSE" : "RESUME"); }
 int QvTranscoder::cbProcess() { return 0; }
 int QvTranscoder::cbMuxClose(QvMuxer*) { return 0; }
+void QvTranscoder::cbMeasure(double) {}
 
 void QvTranscoder::cbPostprocess(const Any& command) {
     const Any text = command.isWString() ? command.toString() : command;

@@ -84,6 +84,9 @@ class QV_API QvTranscoder {
     virtual int cbProcess();  // after every step; non-zero ends the run as a stop does
     virtual void cbPostprocess(const Any& command);
     virtual int cbMuxClose(QvMuxer* muxer);
+    // Before the run, while sound is read for filters that need its level, such as `normalizer`: 0 to 1. On
+    // the thread that calls transcode(), which fails if a stop is asked for meanwhile.
+    virtual void cbMeasure(double part);
 
     // --- Setting up; all of these assert while a run is going on --------------------------------------
 

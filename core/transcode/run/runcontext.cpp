@@ -26,6 +26,11 @@ void RunContext::callProcess() const {
     if (transcoder.cbProcess() != 0) control.stopLoop();
 }
 
+bool RunContext::callMeasure(double part) const {
+    transcoder.cbMeasure(part);
+    return !control.stopping();
+}
+
 void RunContext::waitWhilePaused() const {
     control.waitWhilePaused([this](bool paused) { transcoder.cbPaused(paused); });
 }

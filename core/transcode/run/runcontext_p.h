@@ -23,6 +23,7 @@ struct RunContext {
 
     // During these two the application may ask for filters of the running links.
     void callProgress(double part) const;
-    void callProcess() const;  // what is not 0 stops the loop
+    void callProcess() const;             // what is not 0 stops the loop
+    bool callMeasure(double part) const;  // false once the run is to stop
     void waitWhilePaused() const;
 };

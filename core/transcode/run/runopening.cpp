@@ -1,6 +1,7 @@
 #include "core/transcode/run/runopening_p.h"
 
 #include <string>
+#include <utility>
 
 #include "core/arch/qvassert.h"
 #include "core/arch/qvexception.h"
@@ -28,6 +29,18 @@ std::string narrow(const Any& value) {
     const Any text = value.isWString() ? value.toString() : value;
     return text.isString() ? text.asString() : "";
 }
+
+// What a link reads ahead is watched while this lives.
+class Watching {
+  public:
+    Watching(TransLink& link, QvReadWatch watch) : link_(link) { link_.setReadWatch(std::move(watch)); }
+    Watching(const Watching&) = delete;
+    Watching& operator=(const Watching&) = delete;
+    ~Watching() { link_.setReadWatch({}); }
+
+  private:
+    TransLink& link_;
+};
 
 }  // namespace
 
@@ -100,6 +113,7 @@ int RunOpening::openLinks() {
         TransLink& link = *links.at(i);
         int result = QvStatus::failed;
         link.setCancel(run_.control.cancel());
+        const Watching watching(link, [this](double part) { return run_.callMeasure(part); });
         try {
             result = link.open(&params.at(i).asDict());
         } catch (const QvAssertFailure&) {

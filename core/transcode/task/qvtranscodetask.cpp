@@ -108,6 +108,7 @@ int QvTask::link(QvDecodePipe* decoder, int type, int decStream, int encStream, 
         if (params.get(key).isVector()) own.set(key, params.get(key));
     if (params.get("filters").isDict() && !params.get("filters").asDict().empty())
         own.set("filters", params.get("filters"));
+    if (const auto conversion = params.audioConversion()) own.setAudioConversion(*conversion);
     if (own.empty()) return index;
     if (TransLink* made = getLinkForInput(decoder, type, decStream)) made->setProcessParams(own);
     return index;
@@ -263,6 +264,11 @@ int QvTask::setProcessParams(const ProcessParams& params, int typeMask) {
                           "QvTask.setProcessParams: cannot apply channelMap to non-audio stream");
             own.set("audioChannelMap", params.get("audioChannelMap"));
         }
+        if (const auto conversion = params.audioConversion()) {
+            QV_ASSERT_MSG(type == qvAudioStream,
+                          "QvTask.setProcessParams: cannot apply audioConversion to non-audio stream");
+            own.setAudioConversion(*conversion);
+        }
         if (params.getInt32("smartRender", 0) != 0) own.set("smartRender", params.get("smartRender"));
     }
     return QvStatus::ok;
@@ -295,6 +301,7 @@ constexpr OpenRow openRows[] = {
     {"filters", "effects", isDict, allButAudio},
     {"qualityStats", "qualityStats", isVector, qvAllStreams},
     {"audioChannelMap", "connMatrix", isVector, qvAudioStream},
+    {"audioConversion", "audioConversion", isDict, qvAudioStream},
     {"chapters", "chapters", isVector, qvVideoStream},
 };
 

@@ -77,6 +77,19 @@ TEST_F(AudioChain, TheMatrixIsNormalised) {
     EXPECT_EQ(matrixOf(AnyVector(sources({0}), Any(AnyVector()))), Any(AnyVector(one(0), Any(-1))));
 }
 
+TEST_F(AudioChain, ConvertersGetTheirSettings) {
+    Job job(24, 44100, 2, 16, 48000, 2);
+    Pipe pipe = job.pipe();
+    EXPECT_FALSE(pipe->filter("srconvert", 0)->getParam("quality").isValid()) << "as a new one is";
+    EXPECT_FALSE(pipe->filter("aquant", 1)->getParam("dither").isValid());
+    job.conversion.rateQuality = "high";
+    job.conversion.dither = "triangular";
+    pipe = job.pipe();
+    EXPECT_EQ(pipe->filter("srconvert", 0)->getParam("quality"), Any("high"));
+    EXPECT_FALSE(pipe->filter("aquant", 0)->getParam("dither").isValid()) << "only the last one narrows";
+    EXPECT_EQ(pipe->filter("aquant", 1)->getParam("dither"), Any("triangular"));
+}
+
 TEST_F(AudioChain, OnlyAPositiveDelayIsAFilter) {
     for (const auto& [delay, offset] : {std::pair{Any(200), 0.0},
                                         {Any(-200), 0.2},

@@ -1,5 +1,6 @@
 // Reports for filters that ask for the levels of the sound that reaches them.
 #include <cmath>
+#include <numeric>
 
 #include "core/decode/qvaudiostreamreport.h"
 #include "tests/core/filter/chains.h"
@@ -106,6 +107,30 @@ TEST_F(ChainLoudness, ConvertedRatesAreMeasuredToTheirEnd) {
     for (const int request : decoder_.requests)
         read += request == QvAudioStreamReport::groupSamples ? 0 : request;
     EXPECT_GE(read, 96000);
+}
+
+TEST_F(ChainLoudness, AWatchSeesAllReadingsAndEndsThem) {
+    for (const double end : {2.0, 0.1, 0.5, 0.9}) {
+        decoder_.close();
+        EXPECT_EQ(static_cast<QvDecodePipe&>(decoder_).QvDecodePipe::open(), 0);
+        pipe_->clear();
+        decoder_.requests.clear();
+        Halver &first = halver(1, QvReportNeed::loudness), &second = halver(0, QvReportNeed::loudness);
+        std::vector<double> parts;
+        const bool done =
+            QvProcessUtil::applyStreamReport(pipe_.get(), &decoder_, 0, 0, 96000, [&](double part) {
+                parts.push_back(part);
+                return part < end;
+            });
+        EXPECT_EQ(done, end > 1);
+        EXPECT_TRUE(std::is_sorted(parts.begin(), parts.end()));
+        EXPECT_NEAR(parts.back(), std::min(end, 1.0), 0.03);
+        EXPECT_EQ(first.report.empty(), end < 0.6);
+        EXPECT_EQ(second.report.empty(), end < 1);
+        EXPECT_EQ(decoder_.track(0).position, 0);
+        EXPECT_LT(std::accumulate(decoder_.requests.begin(), decoder_.requests.end(), 0),
+                  3 * 96000 * std::min(end, 1.0) + 9000);
+    }
 }
 
 // Samples of four bytes, as a mixed input has them, have no report of their peak.

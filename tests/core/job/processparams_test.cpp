@@ -23,14 +23,28 @@ TEST(InOutPoints, PairsAreReplacedOrAppended) {
 
 TEST(ProcessParams, AnswersNothingForWhatIsAbsentOrOfAnotherType) {
     ProcessParams params;
-    for (const char* key :
-         {"inOutPoints", "filters", "chapters", "audioChannelMap", "smartRender", "qualityStats"})
+    for (const char* key : {"inOutPoints", "filters", "chapters", "audioChannelMap", "smartRender",
+                            "qualityStats", "audioConversion"})
         params.set(key, "text");
     for (const auto& tested : {ProcessParams(), params}) {
         EXPECT_FALSE(tested.inOutPoints() || tested.filters() || tested.chapterPoints() ||
-                     tested.audioChannelMap() || tested.getQualityStatsSetup());
+                     tested.audioChannelMap() || tested.getQualityStatsSetup() || tested.audioConversion());
         EXPECT_EQ(tested.smartRender(), 0);
     }
+}
+
+TEST(ProcessParams, KeepWhatDiffersFromThePlainConversion) {
+    ProcessParams params;
+    params.setAudioConversion({});
+    EXPECT_EQ(params.get("audioConversion"), Any(AnyDict()));
+    AudioConversion conversion;
+    conversion.rateQuality = "high";
+    conversion.dither = "triangular";
+    params.setAudioConversion(conversion);
+    EXPECT_EQ(params.audioConversion()->rateQuality, "high");
+    EXPECT_EQ(params.audioConversion()->dither, "triangular");
+    params.set("audioConversion", AnyDict("rateQuality", 3));
+    EXPECT_EQ(params.audioConversion()->rateQuality, "standard");
 }
 
 }  // namespace

@@ -91,11 +91,14 @@ int TransALink::openWith(const LinkOpen& given) {
     _getInParams(stream);
     if (const int result = readFormats(stream)) return result;
     QV_ASSERT(decoder_->isSelected(qvAudioStream, decStreamNr_));
+    if (const int result = takeRange(given)) return result;
     takeMatrix(given.connMatrix);
     MediaTime delay;
-    if (const int result = buildPipe(given.audioFilters, delay)) return result;
+    if (const int result = buildPipe(given, delay)) return result;
     *clock_ = SampleClock(in_.samplerate, out_.samplerate);
-    if (const int result = takeRange(given, delay)) return result;
+    if (const int result = takeRange(given)) return result;
+    shiftPoints(delay);
+    computeRange();
     setupSmartRender(given.smartRender);
     if (const int result = openPipe()) return result;
     steps_ = 0;
@@ -138,7 +141,7 @@ bool TransALink::takesMatrix(const AnyVector& given) {
     return fault.empty();
 }
 
-int TransALink::buildPipe(const AnyVector& filters, MediaTime& delay) {
+int TransALink::buildPipe(const LinkOpen& given, MediaTime& delay) {
     AudioJobDescription job;
     job.inBitsPerSample = in_.bits;
     job.inSamplerate = in_.samplerate;
@@ -147,7 +150,8 @@ int TransALink::buildPipe(const AnyVector& filters, MediaTime& delay) {
     job.outSamplerate = out_.samplerate;
     job.outChannels = out_.channels;
     job.connMatrix = matrix_->entries();
-    job.filters = filters;
+    job.filters = given.audioFilters;
+    job.conversion = given.conversion;
     try {
         audioPipe_.reset(QvProcessUtil::createAudioPipe(job, delay));
     } catch (const QvAssertFailure& failure) {
@@ -156,22 +160,22 @@ int TransALink::buildPipe(const AnyVector& filters, MediaTime& delay) {
     return QvStatus::ok;
 }
 
-int TransALink::takeRange(const LinkOpen& given, const MediaTime& delay) {
+MediaTime TransALink::endOfInput() const { return SampleClock::timeOf(in_.samples, in_.samplerate); }
+
+int TransALink::takeRange(const LinkOpen& given) {
     qv_dbg()->debug("ALink.open: input stream has %lld samples", in_.samples);
-    const MediaTime end = SampleClock::timeOf(in_.samples, in_.samplerate);
-    const bool points = takePoints(given, end);
+    const bool points = takePoints(given, endOfInput());
     qv_dbg()->debug("%s", points ? "ALink.open: In/out points are set."
                                  : "ALink.open: In/out points constructed from duration.");
     if (points && outPoint() <= inPoint())
         return setError(QvStatus::failed, "The out point does not lie behind the in point");
-    shiftPoints(delay, end);
-    computeRange();
     return QvStatus::ok;
 }
 
 // Sound that is to come earlier starts later in its input.
-void TransALink::shiftPoints(const MediaTime& delay, const MediaTime& end) {
+void TransALink::shiftPoints(const MediaTime& delay) {
     if (delay.value() <= 0) return;
+    const MediaTime end = endOfInput();
     qv_dbg()->debug("ALink.open: In/out points shifted by negative delay %f.", delay.seconds());
     inOutPoints_.setInPoint(earlier(inPoint() + delay, end));
     inOutPoints_.setOutPoint(earlier(outPoint() + delay, end));
@@ -205,8 +209,11 @@ void TransALink::setupSmartRender(int mode) {
 
 int TransALink::openPipe() {
     if (!audioPipe_) return QvStatus::ok;
-    QvProcessUtil::applyStreamReport(audioPipe_.get(), decoder_, decStreamNr_, clock_->inStart(),
-                                     clock_->inEnd());
+    if (!QvProcessUtil::applyStreamReport(audioPipe_.get(), decoder_, decStreamNr_, clock_->inStart(),
+                                          clock_->inEnd(), readWatch_)) {
+        audioPipe_.reset();
+        return setError(QvStatus::failed, "Stopped while the sound was measured");
+    }
     if (audioPipe_->open() == QvStatus::ok) return QvStatus::ok;
     setError(QvStatus::failed, audioPipe_->errorDesc());
     audioPipe_.reset();
@@ -291,6 +298,7 @@ int TransALink::processFrame(int n) {
 int TransALink::smartStep(int n) {
     QV_STEP_LOG("ALink", "writeFrame sample =%d...", n);
     const int result = audioEncoder()->writePcm(nullptr, n);
+    if (result != QvStatus::ok) copyError(result, audioEncoder()->errorDesc());
     clock_->wrote(n);
     finished_ = clock_->complete();
     ++steps_;

@@ -53,9 +53,10 @@ class QV_API TransALink : public TransLink {
     int readFormats(const AnyDict& stream);
     void takeMatrix(const AnyVector& given);
     bool takesMatrix(const AnyVector& given);
-    int buildPipe(const AnyVector& filters, MediaTime& delay);
-    int takeRange(const LinkOpen& given, const MediaTime& delay);
-    void shiftPoints(const MediaTime& delay, const MediaTime& end);
+    int buildPipe(const LinkOpen& given, MediaTime& delay);
+    MediaTime endOfInput() const;
+    int takeRange(const LinkOpen& given);
+    void shiftPoints(const MediaTime& delay);
     void computeRange();
     void setupSmartRender(int mode);
     int openPipe();

@@ -1,6 +1,8 @@
 #include "builtin/sound/effects/audiodelay.h"
 
-#include "tests/builtin/sound/effects/effect_sounds.h"
+#include <climits>
+
+#include "tests/builtin/sound/sounds.h"
 
 namespace {
 
@@ -30,8 +32,8 @@ TEST(QvADelay, SilenceIsThatOfTheWidth) {
         in.setSamples(60);
         std::memset(in.ptr(0), 77, static_cast<std::size_t>(in.bytes()));
         in.setPosition(1234);
-        ASSERT_EQ(delay.filter.write(in), 0);
-        const QvPcm& out = *delay.filter.pcm();
+        ASSERT_EQ(delay.write(in), 0);
+        const QvPcm& out = *delay.pcm();
         ASSERT_EQ(out.samples(), 60);
         EXPECT_EQ(out.position(), 1234);
         EXPECT_EQ(out.ptr(47)[0], bytes == 1 ? 128 : 0);
@@ -42,12 +44,12 @@ TEST(QvADelay, SilenceIsThatOfTheWidth) {
 TEST(QvADelay, OpenedAgainItStartsWithSilence) {
     Delay delay(AnyDict("delay", 1));
     const Values in(100, 5);
-    const Values first = delay.through(in, 1, 30);
-    EXPECT_EQ(delay.filter.close(), 0);
-    EXPECT_EQ(delay.filter.open(), 0);
-    EXPECT_EQ(delay.through(in, 1, 100), first);
+    const Values first = throughFilter(delay, in, 1, {30});
+    EXPECT_EQ(delay.close(), 0);
+    EXPECT_EQ(delay.open(), 0);
+    EXPECT_EQ(throughFilter(delay, in, 1, {100}), first);
     QvPcm other = soundOf(in, 2);
-    ASSERT_EQ(delay.filter.write(other), -1) << "the ring is of the first format";
+    ASSERT_EQ(delay.write(other), -1) << "the ring is of the first format";
 }
 
 TEST(QvADelay, StoresItsDelay) {

@@ -2,7 +2,11 @@
 #include "builtin/sound/effects/audiolevel.h"
 #include "builtin/sound/effects/panning.h"
 
-#include "tests/builtin/sound/effects/effect_sounds.h"
+#include <array>
+#include <climits>
+#include <cmath>
+
+#include "tests/builtin/sound/sounds.h"
 
 namespace {
 
@@ -82,7 +86,8 @@ TEST(CurveFilters, ChannelsAfterTheEighthStaySilent) {
         OpenedSound<CustomAudioVolume> level;
         AnyDict straight = listsOf("panning_list_", {listOf({{0.0, 100}}, 7)});
         OpenedSound<CAudioPanning> panning(straight);
-        const Values leveled = level.through(in, channels, 1), panned = panning.through(in, channels, 1);
+        const Values leveled = throughFilter(level, in, channels, {1}),
+                     panned = throughFilter(panning, in, channels, {1});
         ASSERT_EQ(leveled.size(), in.size());
         ASSERT_EQ(panned.size(), in.size());
         for (std::size_t i = 0; i < in.size(); ++i) {
@@ -129,10 +134,10 @@ TEST(CAudioPanning, AnOutputIsTheMeanOfWhatItHears) {
 
 TEST(CAudioPanning, TheHighestOutputMakesTheChannels) {
     OpenedSound<CAudioPanning> panning(listsOf("panning_list_", {listOf({{0.0, 100}}, 3)}));
-    EXPECT_EQ(panning.through({7, 8}, 2, 1), (Values{0, 0, 0, 7}));
+    EXPECT_EQ(throughFilter(panning, Values{7, 8}, 2, {1}), (Values{0, 0, 0, 7}));
     // It never falls, until init.
-    EXPECT_EQ(panning.filter.setParam("panning_list_0", Any(listOf({{0.0, 100}}, 0))), 0);
-    EXPECT_EQ(panning.through({7, 8}, 2, 1), (Values{7, 0, 0, 0}));
+    EXPECT_EQ(panning.setParam("panning_list_0", Any(listOf({{0.0, 100}}, 0))), 0);
+    EXPECT_EQ(throughFilter(panning, Values{7, 8}, 2, {1}), (Values{7, 0, 0, 0}));
 }
 
 // Whatever is no list of points is refused and the old list stays.

@@ -1,12 +1,16 @@
 #include "builtin/sound/effects/dynamics.h"
 
+#include <cmath>
+
 #include "core/engine/status.h"
 #include "core/filter/qvprocessutil.h"
-#include "tests/builtin/sound/effects/effect_sounds.h"
+#include "tests/builtin/sound/sounds.h"
 
 namespace {
 
 using Opened = OpenedSound<Dynamics>;
+
+constexpr int fullScale = 1 << 23;
 
 // The formulas as they are written down, one channel and one stage at a time.
 struct Model {
@@ -100,7 +104,7 @@ TEST(Dynamics, TheGateRestartsAtEachChangeOfSide) {
     Values in(4800, 0);
     in.push_back(fullScale / 2);
     in.push_back(0);
-    const Values out = gate.through(in, 1, 1000);
+    const Values out = throughFilter(gate, in, 1, {1000});
     EXPECT_EQ(out[4800], fullScale / 2 / 4800) << "1 / n of what it is";
     EXPECT_EQ(out[4801], 0);
 }
@@ -137,6 +141,10 @@ TEST(Dynamics, StatesAndRefusals) {
     EXPECT_EQ(filter.write(pcm), 0);
     EXPECT_EQ(filter.close(), 0);
     EXPECT_EQ(filter.samples(), 1) << "what waits stays";
+    filter.setParam("_channels", 9);
+    EXPECT_EQ(filter.open(), -1);
+    EXPECT_STREQ(filter.errorDesc(), "dynamics works on up to 8 channels, the sound has 9");
+    filter.setParam("_channels", 8);
     EXPECT_EQ(filter.open(), 0);
     filter.erase(1);
     pcm = soundOf(Values(9, 1), 9);
@@ -156,12 +164,12 @@ TEST(Dynamics, StatesAndRefusals) {
 TEST(Dynamics, AStageReadsAllThatThePreviousOneHolds) {
     Opened filter(AnyDict("limiterActive", 1, "noisegateActive", 1, "noisegateLevel", -100.0));
     QvPcm pcm = soundOf(Values(10, 1000), 1);
-    filter.filter.write(pcm);
-    filter.filter.write(pcm);
-    EXPECT_EQ(filter.filter.samples(), 30) << "without an erase between them";
-    filter.filter.erase(30);
-    filter.filter.write(pcm);
-    EXPECT_EQ(filter.filter.samples(), 10);
+    filter.write(pcm);
+    filter.write(pcm);
+    EXPECT_EQ(filter.samples(), 30) << "without an erase between them";
+    filter.erase(30);
+    filter.write(pcm);
+    EXPECT_EQ(filter.samples(), 10);
 }
 
 TEST(Dynamics, DescribesStoresAndTakesItsReport) {

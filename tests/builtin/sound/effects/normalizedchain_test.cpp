@@ -1,13 +1,29 @@
 // The normalizer in a pipe, from its report to what comes out.
+#include <cmath>
+#include <numbers>
+
+#include "core/arch/qvexception.h"
 #include "core/engine/modules/qvregistry.h"
 #include "core/filter/qvprocesspipe.h"
 #include "core/filter/qvprocessutil.h"
+#include "core/job/jobdescription.h"
 #include "core/media/qvloudness.h"
-#include "tests/builtin/sound/effects/effect_sounds.h"
+#include "core/transcode/run/qvtranscoder.h"
+#include "core/transcode/task/qvtranscodetask.h"
+#include "tests/builtin/sound/sounds.h"
 #include "tests/support/engine.h"
 #include "tests/support/fake_streams.h"
 
 namespace {
+
+Values sine(int samples, int channels, double amplitude, double hertz) {
+    Values values;
+    for (int i = 0; i < samples; ++i)
+        values.insert(values.end(), static_cast<std::size_t>(channels),
+                      static_cast<int>(std::lround(amplitude * (1 << 23) *
+                                                   std::sin(2 * std::numbers::pi * hertz * i / 48000))));
+    return values;
+}
 
 // One stream of 32-bit samples, as a mixed input has them.
 class WideDecoder : public FakeDecoder {
@@ -105,6 +121,86 @@ TEST(NormalizedChain, TheTruePeakIsTheLimitAndSilenceStays) {
     QvLoudness silence;
     play(silent, {{"normalizer", AnyDict("mode", "loudness")}}, 0, 48000, silence);
     EXPECT_EQ(silence.samplePeak(), QvLoudness::silence);
+}
+
+// The chain that the engine makes by itself, with its real converters.
+TEST(SoundChain, IsRefusedBeforeItRuns) {
+    const EngineScope engine;
+    const auto filter = [](const char* name, int front) {
+        return AnyVector(Any(AnyDict("name", name, "_on", 1, "_front", front)));
+    };
+    const struct {
+        int inChannels, outChannels;
+        AnyVector filters;
+        const char *quality, *dither, *refused;  // null: it opens
+    } rows[] = {
+        {2, 2, {}, "standard", "triangular", nullptr},
+        {2, 2, {}, "best", "none", "'quality' takes standard (16 taps"},
+        {2, 2, {}, "standard", "some", "'dither' takes none or triangular"},
+        {9, 2, filter("dynamics", 1), "standard", "none",
+         "dynamics works on up to 8 channels, the sound has 9"},
+        {9, 2, filter("dynamics", 0), "standard", "none", nullptr},
+        {2, 16, filter("dynamics", 0), "standard", "none", "the sound has 16"},
+        {2, 16, filter("avol", 0), "standard", "none", nullptr},
+    };
+    for (const auto& row : rows) {
+        AudioJobDescription job;
+        job.inBitsPerSample = job.outBitsPerSample = 16;
+        job.inSamplerate = 44100, job.outSamplerate = 48000;
+        job.inChannels = row.inChannels, job.outChannels = row.outChannels;
+        for (int i = 0; i < row.outChannels; ++i) job.connMatrix.append(Any(AnyDict("channel", 0)));
+        job.filters = row.filters;
+        job.conversion.rateQuality = row.quality, job.conversion.dither = row.dither;
+        MediaTime delay;
+        std::string why;
+        try {
+            const std::unique_ptr<QvAProcessPipe> pipe(QvProcessUtil::createAudioPipe(job, delay));
+            if (pipe->open() != 0) why = pipe->errorDesc();
+        } catch (const QvAssertFailure& failure) {
+            why = failure.what();
+        }
+        EXPECT_EQ(why.empty(), !row.refused) << why;
+        EXPECT_NE(why.find(row.refused ? row.refused : ""), std::string::npos) << why;
+    }
+}
+
+// A stop while the sound is measured ends the run before it begins.
+TEST(NormalizedChain, AStopEndsTheMeasurement) {
+    class Measured : public QvTranscoder {
+      public:
+        using QvTranscoder::QvTranscoder;
+        void cbMeasure(double part) override {
+            last = part;
+            if (part > stopAt) requestStop();
+        }
+        void cbDone(int result) override { done = result; }
+        double stopAt = 2, last = -1;
+        int done = -99;
+    };
+    const EngineScope engine;
+    for (const double stopAt : {2.0, 0.4}) {
+        FakeDecoder decoder(1, QvFramerate::f25p());
+        decoder.audio(480000, 48000);
+        ASSERT_EQ(static_cast<QvDecodePipe&>(decoder).QvDecodePipe::open(), 0);
+        FakeEncodePipe pipe(QvFramerate::f25p());
+        pipe.audio(48000);
+        QvTask task;
+        task.setEncoder(&pipe);
+        ProcessParams params;
+        FiltersState filters;
+        filters.appendFilter("normalizer", AnyDict("name", "normalizer", "_on", 1));
+        params.setFilters(filters);
+        ASSERT_GE(task.link(&decoder, 2, 0, 0, params), 0) << task.errorDesc();
+        Measured run(&task);
+        run.setParam("startDelay", 0);
+        run.stopAt = stopAt;
+        const bool stopped = stopAt < 1;
+        EXPECT_EQ(run.transcode(true), stopped ? QvStatus::failed : 0) << run.errorDesc();
+        EXPECT_NEAR(run.last, std::min(stopAt, 1.0), 0.02);
+        EXPECT_EQ(run.done, stopped ? -99 : 0);
+        EXPECT_EQ(pipe.audios.front()->counts.empty(), stopped);
+        EXPECT_EQ(std::strstr(run.errorDesc(), "Stopped while the sound was measured") != nullptr, stopped);
+    }
 }
 
 }  // namespace

@@ -1,7 +1,9 @@
 #include "builtin/sound/effects/normalizer.h"
 
+#include <cmath>
+
 #include "core/filter/qvfilter.h"
-#include "tests/builtin/sound/effects/effect_sounds.h"
+#include "tests/builtin/sound/sounds.h"
 
 namespace {
 
@@ -17,7 +19,7 @@ AnyDict with(AnyDict params, const AnyDict& levels) {
     return params;
 }
 
-double gainOf(const AnyDict& params) { return Opened(params).filter.getParam("gain").asFloat(99.0); }
+double gainOf(const AnyDict& params) { return Opened(params).getParam("gain").asFloat(99.0); }
 
 TEST(QvNormalizer, ReachesItsTargetAsFarAsTheTruePeakAllows) {
     const double none = -HUGE_VAL;
@@ -71,7 +73,7 @@ TEST(QvNormalizer, TheGainIsLinearAndBounded) {
             << gain;
     }
     Opened unknown;
-    EXPECT_EQ(unknown.through(in, 16, 100), in);
+    EXPECT_EQ(throughFilter(unknown, in, 16, {100}), in);
 }
 
 TEST(QvNormalizer, ParametersAreCheckedAndStored) {
@@ -92,16 +94,21 @@ TEST(QvNormalizer, ParametersAreCheckedAndStored) {
     AnyDict state;
     filter.store(state);
     EXPECT_FALSE(state.isSet("target"));
-    filter.setParam("target", -16);
-    filter.store(state);
-    EXPECT_EQ(other.restore(state), 0);
-    EXPECT_EQ(other.getParam("mode"), Any("loudness"));
-    EXPECT_EQ(other.getParam("target"), Any(-16.0));
+    for (const double target : {-16.0, -3.0}) {  // the latter is the default of another mode
+        filter.setParam("target", target);
+        filter.store(state);
+        EXPECT_EQ(other.restore(state), 0);
+        EXPECT_EQ(other.getParam("mode"), Any("loudness"));
+        EXPECT_EQ(other.getParam("target"), Any(target));
+    }
+    state.set("target", 5.0), state.set("mode", "loud");
+    EXPECT_NE(other.restore(state), 0);
+    EXPECT_EQ(other.getParam("target"), Any(-3.0)) << "one bad value, and none is taken";
     QvPcm pcm = soundOf({1, 2}, 2);
     EXPECT_EQ(failureOf([&] { other.write(pcm); }), "Not opened");
     other.open();
     pcm.init(1, 2, 2, 48000);
-    EXPECT_EQ(other.write(pcm), -1);
+    EXPECT_EQ(failureOf([&] { other.write(pcm); }), "Only 32 bit samples supported");
 }
 
 }  // namespace

@@ -3,7 +3,7 @@
 
 #include <cmath>
 
-#include "tests/builtin/sound/format/sound_blocks.h"
+#include "tests/builtin/sound/sounds.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/vector_targets.h"
 

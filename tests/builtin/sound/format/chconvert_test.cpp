@@ -2,7 +2,7 @@
 #include "builtin/sound/format/chconvert.h"
 
 #include "core/arch/qvassert.h"
-#include "tests/builtin/sound/format/sound_blocks.h"
+#include "tests/builtin/sound/sounds.h"
 
 namespace {
 

@@ -9,7 +9,7 @@
 #include "builtin/sound/format/resampler.h"
 #include "builtin/sound/format/soxrrate.h"
 #include "core/engine/modules/qvregistry.h"
-#include "tests/builtin/sound/format/sound_blocks.h"
+#include "tests/builtin/sound/sounds.h"
 #include "tests/support/engine.h"
 #include "tests/support/fake_streams.h"
 #include "tests/support/log_capture.h"
@@ -118,6 +118,21 @@ TEST(Srconvert, TakesOneToSixteenChannels) {
     for (int channels = 1; channels <= 16; ++channels)
         for (const auto& [in, out] : {std::pair(44100, 48000), std::pair(96000, 44100)})
             compareWithModel(in, out, channels, 900, 100, {channels * 11, 3});
+}
+
+// After each second the converter stands where it stood before it, so that no length makes it drift.
+TEST(Srconvert, EverySecondIsTheSame) {
+    for (const int in : {8000, 11025, 44100, 48000, 96000})
+        for (const int out : {8000, 22050, 44100, 48000, 192000}) {
+            if (in == out) continue;
+            Values second = noise(static_cast<size_t>(in)), three;
+            for (int i = 0; i < 4; ++i) three.insert(three.end(), second.begin(), second.end());
+            Opened filter{{"inSamplerate", in}, {"outSamplerate", out}};
+            const Values made = throughFilter(filter, three, 1, {in / 3});
+            const auto begin = made.begin() + out;
+            ASSERT_GT(made.size(), static_cast<size_t>(3 * out));
+            EXPECT_TRUE(std::equal(begin, begin + out, begin + out)) << in << " to " << out;
+        }
 }
 
 TEST(Srconvert, AllVectorUnitsGiveTheSame) {

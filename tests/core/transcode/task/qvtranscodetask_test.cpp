@@ -19,13 +19,16 @@ TEST(TaskParams, ALinksOwnWinOverTheTasks) {
     job.task.setProcessParams(ProcessParams(AnyDict("inOutPoints", otherPoints, "smartRender", 1)), 0);
     job.task.setProcessParams(ProcessParams(AnyDict("filters", AnyDict("a", 1))), 1);
     job.task.setProcessParams(
-        ProcessParams(AnyDict("filters", AnyDict("b", 1), "audioChannelMap", AnyVector(Any(7)))), 2);
+        ProcessParams(AnyDict("filters", AnyDict("b", 1), "audioChannelMap", AnyVector(Any(7)),
+                              "audioConversion", AnyDict("dither", "triangular"))),
+        2);
     AnyVector params;
     QvTask::makeOpenParams(job.task, job.task.links(), params);
     EXPECT_EQ(params, AnyVector(Any(AnyDict("inOutPoints", points, "chapters", AnyVector(Any(5)),
                                             "smartRender", 1, "effects", AnyDict("a", 1))),
                                 Any(AnyDict("inOutPoints", otherPoints, "smartRender", 1, "audioEffects",
-                                            AnyDict("b", 1), "connMatrix", AnyVector(Any(7))))));
+                                            AnyDict("b", 1), "connMatrix", AnyVector(Any(7)),
+                                            "audioConversion", AnyDict("dither", "triangular")))));
 }
 
 struct DolbyEncoder : FakeAudioEncoder {

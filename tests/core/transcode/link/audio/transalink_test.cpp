@@ -75,6 +75,13 @@ TEST(TransALink, FailuresComeOut) {
          -1, 0, "invalid samplerates (==0)"},
         {[](Job& j) { j.decoder.tracks[0]->total = 0; }, 0, -1, "Audio error, can not read samples"},
         {[](Job& j) {
+             j.decoder.extra.set("srParams", AnyDict("frame", 1536));
+             j.audio().params.set("srPossible", 0);
+             j.params.set("smartRender", 1);
+             j.audio().result = -7;
+         },
+         0, -7, ""},
+        {[](Job& j) {
              j.decoder.tracks[0]->total = 0;
              j.audio().params.set("samplerate", 44100);  // through a pipe
          },
@@ -108,14 +115,27 @@ TEST(TransALink, RangeOfSamples) {
         {441000, 44100, 48000, 1.0, 3.0, 96000},
         {480000, 48000, 44100, 0.5, 2.5, 88200},
         {-1, 48000, 48000, -1, 0, 92233720368547LL},
+        {-1, 8000, 192000, -1, 0, 24 * 92233720368547LL},
+        {86400LL * 44100, 44100, 48000, -1, 0, 86400LL * 48000},
+        {86400LL * 48000, 48000, 44100, 3600.0, 86399.5, 3651457950},
         {48000, 48000, 48000, 0.25, 0, 36000},
     };
     for (const auto& row : rows) {
+        LogCapture log;
         Job job(row.samples, row.inRate, row.outRate);
         if (row.in >= 0) job.params.set("inOutPoints", points(row.in, row.out));
         ASSERT_EQ(job.open(), 0);
         EXPECT_EQ(job.link.totalOutSamples(), row.total);
+        EXPECT_EQ(log.count("ALink.open: input stream has "), 2) << "before the matrix and before the range";
     }
+}
+
+TEST(TransALink, TheConvertersAreAsTheJobSays) {
+    Job job(4000, 44100, 48000);
+    job.params.set("audioConversion", AnyDict("rateQuality", "high", "dither", "triangular"));
+    ASSERT_EQ(job.open(), 0);
+    EXPECT_EQ(job.link.filter("srconvert", 0)->getParam("quality"), Any("high"));
+    EXPECT_EQ(job.link.filter("aquant", 1)->getParam("dither"), Any("triangular"));
 }
 
 TEST(TransALink, ANegativeDelaySkipsInput) {

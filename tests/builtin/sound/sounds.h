@@ -11,6 +11,7 @@
 #include <vector>
 
 #include "core/filter/qvfilter.h"
+#include "core/measure/qvgeometry.h"
 #include "core/media/qvpcm.h"
 #include "tests/support/checks.h"
 
@@ -24,7 +25,12 @@ struct Param {
 
 template <class Filter>
 struct OpenedSound : Filter {
-    OpenedSound(std::initializer_list<Param> params) {
+    explicit OpenedSound(const AnyDict& params) {
+        EXPECT_EQ(this->init(), 0);
+        EXPECT_EQ(this->setParamDict(params), 0) << this->errorDesc();
+        EXPECT_EQ(this->open(), 0) << this->errorDesc();
+    }
+    OpenedSound(std::initializer_list<Param> params = {}) {
         EXPECT_EQ(this->init(), 0);
         for (const Param& param : params) EXPECT_EQ(this->setParam(param.name, param.value), 0) << param.name;
         EXPECT_EQ(this->open(), 0) << this->errorDesc();
@@ -55,6 +61,11 @@ inline Values valuesOf(const Bytes& bytes) {
     return values;
 }
 
+// Wide values.
+inline QvPcm soundOf(const Values& values, int channels, int rate = 48000) {
+    return pcmOf(bytesOf(values), channels, 4, rate);
+}
+
 // Takes all that is ready.
 inline void take(QvAudioFilter& filter, Bytes& to) {
     const int n = filter.samples();
@@ -64,7 +75,7 @@ inline void take(QvAudioFilter& filter, Bytes& to) {
 }
 
 inline Bytes throughFilter(QvAudioFilter& filter, const Bytes& in, int channels, int width,
-                           const Blocks& blocks = {}) {
+                           const Blocks& blocks = {}, int rate = 48000) {
     Bytes out;
     const size_t sample = static_cast<size_t>(channels * width);
     size_t at = 0;
@@ -74,7 +85,7 @@ inline Bytes throughFilter(QvAudioFilter& filter, const Bytes& in, int channels,
         const size_t size = std::min(wanted, in.size() - at);
         QvPcm pcm = pcmOf(
             Bytes(in.begin() + static_cast<ptrdiff_t>(at), in.begin() + static_cast<ptrdiff_t>(at + size)),
-            channels, width);
+            channels, width, rate);
         EXPECT_EQ(filter.write(pcm), 0) << filter.errorDesc();
         take(filter, out);
         at += size;
@@ -82,9 +93,22 @@ inline Bytes throughFilter(QvAudioFilter& filter, const Bytes& in, int channels,
     return out;
 }
 
-inline Values throughFilter(QvAudioFilter& filter, const Values& in, int channels,
-                            const Blocks& blocks = {}) {
-    return valuesOf(throughFilter(filter, bytesOf(in), channels, 4, blocks));
+inline Values throughFilter(QvAudioFilter& filter, const Values& in, int channels, const Blocks& blocks = {},
+                            int rate = 48000) {
+    return valuesOf(throughFilter(filter, bytesOf(in), channels, 4, blocks, rate));
+}
+
+// The same output for blocks of any size.
+template <class Filter>
+Values throughBlocks(const AnyDict& params, const Values& in, int channels, int rate = 48000) {
+    const auto through = [&](const Blocks& blocks) {
+        OpenedSound<Filter> filter(params);
+        return throughFilter(filter, in, channels, blocks, rate);
+    };
+    const Values whole = through({});
+    for (const Blocks& blocks : {Blocks{0, 37, 74, 1000}, Blocks{1}, Blocks{64}, Blocks{4096}})
+        EXPECT_TRUE(through(blocks) == whole) << blocks.front();
+    return whole;
 }
 
 // Values of 24 bits and, among them, the bounds of 24 and 32 bits.

@@ -6,8 +6,10 @@
 
 #include "core/media/qvpcm.h"
 
-// All values of the filled samples, interleaved; there is at least one sample.
-inline const int* soundValues(const QvPcm& pcm) { return reinterpret_cast<const int*>(pcm.ptr(0)); }
+// The values from a filled sample on, interleaved.
+inline const int* soundValues(const QvPcm& pcm, int sample = 0) {
+    return reinterpret_cast<const int*>(pcm.ptr(sample));
+}
 
 // Without its fraction, at the nearest end of the range if it lies outside. Not for NaN.
 inline int saturated(double value) { return static_cast<int>(std::clamp<double>(value, INT_MIN, INT_MAX)); }

@@ -1,11 +1,11 @@
-// What the filters that change the format of sound share: they store the parameters that were changed.
+// Filters that store the parameters that were changed.
 #pragma once
 
 #include "builtin/sound/soundfilter.h"
 #include "core/engine/log/qvlog.h"
 
 template <class Settings>
-class FormatFilterOf : public SoundFilterOf<Settings> {
+class StoredFilterOf : public SoundFilterOf<Settings> {
   public:
     // A value that a row with its own rules refuses is answered with the help of the row.
     int setParam(const char* name, const Any& value) override {
