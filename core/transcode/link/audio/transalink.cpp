@@ -158,7 +158,7 @@ int TransALink::buildPipe(const AnyVector& filters, MediaTime& delay) {
 
 int TransALink::takeRange(const LinkOpen& given, const MediaTime& delay) {
     qv_dbg()->debug("ALink.open: input stream has %lld samples", in_.samples);
-    const MediaTime end = SampleClock::timeOf(in_.samples, in_.samplerate);
+    const MediaTime end = qvInstantOf(in_.samples, QvRatio(in_.samplerate, 1));
     const bool points = takePoints(given, end);
     qv_dbg()->debug("%s", points ? "ALink.open: In/out points are set."
                                  : "ALink.open: In/out points constructed from duration.");
