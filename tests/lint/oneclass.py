@@ -22,7 +22,6 @@ OPEN = {
     "Any",
     "AnyDict",
     "AnyVector",
-    "Job",
     "QvBitrate",
     "QvCcData",
     "QvCodec",

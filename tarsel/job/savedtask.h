@@ -1,0 +1,9 @@
+// A job as a task file.
+#pragma once
+
+#include "tarsel/host/signals.h"
+#include "tarsel/job/jobparts.h"
+
+// Writes it where the outputs say, if there is to be one. A stream that waits for its reader is left at the
+// first signal. Throws Failure.
+void saveTask(JobParts& parts, const JobOptions& options, Signals& signals);
