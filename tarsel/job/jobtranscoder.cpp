@@ -24,10 +24,10 @@ void JobTranscoder::join(const std::vector<ProcessParams>& params) {
     setParam("progress", off);
     for (size_t i = 0; i < params.size(); ++i) {
         const PlannedStream& s = parts_.plan.streams[i];
-        if (QvTranscoder::link(&parts_.source(s).decoder(), s.type, s.part.stream, s.number, params[i]) < 0)
+        if (link(&parts_.source(s).decoder(), s.type, s.part.stream, s.number, params[i]) < 0)
             throw failure(Msg::linkFailed, {parts_.plan.input(s).name});
     }
-    first_ = link(parts_.plan.streams.front());
+    first_ = linkOf(parts_.plan.streams.front());
 }
 
 int JobTranscoder::cbProcess() {
@@ -40,7 +40,7 @@ int JobTranscoder::cbProcess() {
 // The counts have to be taken before the links close.
 int JobTranscoder::cbMuxClose(QvMuxer*) {
     for (size_t i = 0; i < written_.size(); ++i)
-        if (const TransLink* of = link(parts_.plan.streams[i])) written_[i] = of->outProcessed();
+        if (const TransLink* of = linkOf(parts_.plan.streams[i])) written_[i] = of->outProcessed();
     takeFilterFailure();
     last_ = state("closing");
     phase_ = "closing";
@@ -106,7 +106,7 @@ ProgressState JobTranscoder::stateAt(long long units, const char* name) const {
 
 std::string JobTranscoder::reason() const {
     for (const PlannedStream& stream : parts_.plan.streams)
-        if (const TransLink* of = link(stream); of && of->errorCode() != 0 && *of->errorDesc())
+        if (const TransLink* of = linkOf(stream); of && of->errorCode() != 0 && *of->errorDesc())
             return of->errorDesc();
     AnyVector messages;
     qv_log()->getAll(messages);
@@ -118,7 +118,7 @@ std::string JobTranscoder::reason() const {
 
 void JobTranscoder::takeFilterFailure() {
     for (const PlannedStream& stream : parts_.plan.streams) {
-        const TransLink* of = link(stream);
+        const TransLink* of = linkOf(stream);
         if (!of || !stream.isVideo()) continue;
         for (const Any& name : stream.filters.names(true))
             for (int i = 0; const QvCodec* filter = of->filter(name.asString(""), i); ++i)

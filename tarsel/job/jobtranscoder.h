@@ -36,7 +36,7 @@ class JobTranscoder : public QvTranscoder {
     const std::vector<long long>& written() const { return written_; }
     const std::optional<Failure>& filterFailure() const { return filterFailure_; }
     // Null for a stream that was not joined.
-    const TransLink* link(const PlannedStream& stream) const {
+    const TransLink* linkOf(const PlannedStream& stream) const {
         return getLinkForOutput(stream.type, stream.number);
     }
     // Why the run failed: a link knows it better than the log, and that better than the run.

@@ -17,7 +17,7 @@ bool failedForMemory(const JobParts& parts, const JobTranscoder& run) {
     if (lacked(&pipe) || lacked(pipe.getMuxer()) || lacked(pipe.sink())) return true;
     if (fileLacked(pipe.sink()->stream())) return true;
     return std::any_of(parts.plan.streams.begin(), parts.plan.streams.end(), [&](const PlannedStream& s) {
-        const TransLink* link = run.link(s);
+        const TransLink* link = run.linkOf(s);
         return lacked(&parts.source(s).decoder()) || lacked(parts.encoder(s)) ||
                (link && link->errorCode() == QvStatus::outOfMemory) || fileLacked(parts.file(s));
     });

@@ -5,6 +5,29 @@
 #include "tarsel/job/plan/jobplan.h"
 #include "tarsel/words/messages.h"
 
+namespace {
+
+// The time at the start of the sound that a filter lets the link skip.
+MediaTime skippedBy(const FiltersState& filters, const SoundFormat& in, const SoundFormat& out) {
+    AudioJobDescription job;
+    job.inSamplerate = in.samplerate;
+    job.inChannels = in.channels;
+    job.inBitsPerSample = in.bits;
+    job.outSamplerate = out.samplerate;
+    job.outChannels = out.channels;
+    job.outBitsPerSample = out.bits;
+    job.filters = filters.getVector("customFilters");
+    MediaTime skipped;
+    try {
+        const std::unique_ptr<QvAProcessPipe> pipe(QvProcessUtil::createAudioPipe(job, skipped));
+    } catch (const QvAssertFailure& failure) {
+        throw ::failure(Msg::chainRefused, {failure.what()});
+    }
+    return skipped;
+}
+
+}  // namespace
+
 FilterPlanner::FilterPlanner(JobPlan& plan, const EffectOptions& options) : plan_(plan), options_(options) {
     for (PlannedStream& stream : plan.streams) {
         if (!stream.isVideo()) continue;
@@ -58,4 +81,5 @@ void FilterPlanner::planSound(PlannedStream& stream) const {
     if (in.channels != out.channels) require("chconvert");
     // Filters work on 32 bits.
     if (in.bits != out.bits || !stream.filters.empty()) require("aquant");
+    if (!stream.filters.empty()) stream.skipped = skippedBy(stream.filters, in, out);
 }

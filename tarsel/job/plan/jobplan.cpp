@@ -148,8 +148,9 @@ JobPlan planJob(const PlanOptions& options, const OutputForm& output, std::vecto
     checkCounts(plan);
     warnOfUnused(plan, options);
     planPoints(plan, {options.from, options.to, options.duration});
-    planLengths(plan);
+    planFrames(plan);
     filters.plan();
+    planSamples(plan);
     return plan;
 }
 

@@ -31,6 +31,7 @@ struct PlannedStream {
     std::vector<std::string> chain;  // a line for each filter, to be shown
 
     long long expected = 0;  // frames or samples of the output
+    MediaTime skipped;       // audio: of the input, for a filter that lets the sound come earlier
     long long own = 0;       // audio: samples of the output that the part itself has
     long long frame = 0;     // audio: most samples that belong to one frame of the picture; 0 without one
 

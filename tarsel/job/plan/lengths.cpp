@@ -1,5 +1,7 @@
 #include "tarsel/job/plan/lengths.h"
 
+#include <algorithm>
+
 #include "tarsel/job/plan/jobplan.h"
 #include "tarsel/words/messages.h"
 #include "tarsel/words/timespec.h"
@@ -17,28 +19,37 @@ void setFrames(const JobPlan& plan, PlannedStream& stream) {
     stream.expected = range.out;
 }
 
-void setSamples(const JobPlan& plan, PlannedStream& stream, const PlannedStream* picture) {
-    const int samplerate = stream.sound.samplerate;
-    stream.own =
-        QvSampleRange(stream.part.in, stream.part.out, plan.source(stream).sound.samplerate, samplerate).out;
-    stream.expected = stream.own;
-    if (!picture) return;
-    const auto samplesOf = [&](long long frames) {
-        return QvUtil::samplesForFrames(static_cast<int>(frames), picture->picture.rate, samplerate);
+// As the audio link does: sound that comes earlier starts later in its input.
+long long ownSamples(const JobPlan& plan, const PlannedStream& stream) {
+    const InputStream& source = plan.source(stream);
+    const auto moved = [&](const MediaTime& point) {
+        const MediaTime later = point + stream.skipped, end = source.end();
+        return later < end ? later : end;
     };
-    stream.expected = samplesOf(picture->expected);
-    stream.frame = samplesOf(1) + 1;
+    const StreamPart& part = stream.part;
+    return QvSampleRange(moved(part.in), moved(part.out), source.sound.samplerate, stream.sound.samplerate)
+        .out;
 }
 
 }  // namespace
 
-void planLengths(JobPlan& plan) {
-    const PlannedStream* picture = nullptr;
-    for (PlannedStream& stream : plan.streams) {
-        if (!stream.isVideo()) continue;
-        setFrames(plan, stream);
-        picture = &stream;
-    }
+void planFrames(JobPlan& plan) {
     for (PlannedStream& stream : plan.streams)
-        if (!stream.isVideo()) setSamples(plan, stream, picture);
+        if (stream.isVideo()) setFrames(plan, stream);
+}
+
+void planSamples(JobPlan& plan) {
+    const auto last = std::find_if(plan.streams.rbegin(), plan.streams.rend(),
+                                   [](const PlannedStream& s) { return s.isVideo(); });
+    for (PlannedStream& stream : plan.streams) {
+        if (stream.isVideo()) continue;
+        stream.expected = stream.own = ownSamples(plan, stream);
+        if (last == plan.streams.rend()) continue;
+        const auto samplesOf = [&](long long frames) {
+            return QvUtil::samplesForFrames(static_cast<int>(frames), last->picture.rate,
+                                            stream.sound.samplerate);
+        };
+        stream.expected = samplesOf(last->expected);
+        stream.frame = samplesOf(1) + 1;
+    }
 }

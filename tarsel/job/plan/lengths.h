@@ -1,8 +1,11 @@
-// How much of each stream a job will write.
+// How much of each stream a job will write: the frames and samples that the engine counts.
 #pragma once
 
 struct JobPlan;
 
-// Sets the expected frames and samples, as the engine counts them. Sound next to a picture gets the samples
-// that belong to the picture's frames. Throws Failure for points that no frame lies between.
-void planLengths(JobPlan& plan);
+// Sets the expected frames. The parts and the formats have to be known. Throws Failure for points that no
+// frame lies between.
+void planFrames(JobPlan& plan);
+// Sets the expected samples: next to a picture those that belong to its frames, otherwise those of the part.
+// The expected frames and the filters have to be known.
+void planSamples(JobPlan& plan);
