@@ -3,6 +3,7 @@
 #include <array>
 #include <cerrno>
 #include <cstring>
+#include <new>
 #include <optional>
 #include <vector>
 
@@ -91,9 +92,13 @@ void SeekPatch::done(int abort) {
         if (!abort && (!patches_.empty() || reorder_)) failure_->note(ESPIPE, "Failed to patch", name_);
         return;
     }
-    if (!patches_.empty() && !abort) applyPatches();
+    try {
+        if (!patches_.empty() && !abort) applyPatches();
+        if (reorder_) moveBlock(name_, *reorder_, *failure_);
+    } catch (const std::bad_alloc&) {
+        failure_->note(ENOMEM, "No memory for a patch of", name_);
+    }
     patches_.clear();
-    if (reorder_) moveBlock(name_, *reorder_, *failure_);
 }
 
 }  // namespace
