@@ -29,7 +29,6 @@ namespace fs = std::filesystem;
 
 namespace {
 
-constexpr long long kTicks = 35280000;
 constexpr int kVideoFilter = 12;
 constexpr int kSheetWidth = 1920;  // pixels a contact sheet is at most wide
 constexpr int kMostCells = 32;     // in each direction
@@ -186,7 +185,7 @@ int checkDamage(const Source& source, bool acceptPartial) {
 MediaTime lengthOf(const Source& source) {
     QvDecodePipe& decoder = source.decoder();
     const auto rate = source.frameRate();
-    return rate ? MediaTime(decoder.nrFrames(0), *rate, kTicks) : decoder.duration(1, 0);
+    return rate ? qvInstantOf(decoder.nrFrames(0), rate->rate()) : decoder.duration(1, 0);
 }
 
 void frame(Given& given) {
@@ -211,7 +210,7 @@ void frame(Given& given) {
     if (!given.sheet.empty()) return saveSheet(source, reader, given);
     const auto rate = source.frameRate();
     const MediaTime at =
-        given.at.empty() ? MediaTime(0LL, kTicks) : parseInstant(given.at, rate, "--at", lengthOf(source));
+        given.at.empty() ? MediaTime() : parseInstant(given.at, rate, "--at", lengthOf(source));
     if (rate && at.position(*rate) >= source.decoder().nrFrames(0))
         throw failure(Msg::atAfterEnd, {given.at, given.input, formatTime(source.duration())});
     const long long number = std::min(rate ? at.position(reader.format().rate) : 0, reader.frames() - 1);

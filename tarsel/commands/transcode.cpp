@@ -61,7 +61,7 @@ void transcode(Given& given, Signals& signals) {
     for (int attempt = 1;; ++attempt) {
         Job job(given.job, signals);
         job.checkWarnings();
-        if (given.job.dryRun) return job.plan();
+        if (given.job.dryRun) return job.printPlan();
         try {
             return job.run();
         } catch (const InputShrank& shrank) {

@@ -4,6 +4,10 @@
 
 #include <qvplugcore/qvplugcore.h>
 
+#include "tarsel/host/command.h"
+#include "tarsel/host/events.h"
+#include "tarsel/words/messages.h"
+
 namespace {
 
 std::string quoted(const std::string& name) { return QvFile::shellQuote(Any(name.c_str())).asString(); }
@@ -33,6 +37,16 @@ std::string folderName(const std::string& output) {
     return folder.empty() ? "./" : folder + "/";
 }
 
+// The standard output that has the result, and a stream that has the objects of --progress, get nothing else.
+const char* redirection(bool outputTaken) {
+    const int objects = Events::get().descriptor();
+    const bool noOutput = objects == 1 || outputTaken, noErrors = objects == 2;
+    return noOutput && noErrors ? "exec >/dev/null 2>&1\n"
+           : noOutput           ? "exec 1>&2\n"
+           : noErrors           ? "exec 2>&1\n"
+                                : "";
+}
+
 }  // namespace
 
 std::string postCommand(const std::string& command, const std::vector<std::string>& inputs,
@@ -53,4 +67,32 @@ std::string postCommand(const std::string& command, const std::vector<std::strin
         }
     }
     return result;
+}
+
+void runPost(const PostJob& job, Signals& signals) {
+    const std::string first = job.outputs.empty() ? job.output : job.outputs.front();
+    const auto stopIfSignalled = [&](Msg why) {
+        if (const Exit signalled = signals.received(); signalled != Exit::done)
+            throw Failure(signalled, lineOf(why, {first}));
+    };
+    stopIfSignalled(Msg::stoppedBeforePost);
+    const std::string line = redirection(job.outputTaken) + postCommand(job.command, job.inputs, job.outputs);
+    const auto report = [] { tell(Level::note, lineOf(Msg::postRuns)); };
+    ShellCommand command;
+    int status = 0;
+    {
+        const Signals::Watch running(signals, {.first = [&](int signal) { command.signal(signal); },
+                                               .second = [&] { return command.kill(), false; },
+                                               .report = report,
+                                               .last = Msg::stoppedInPost,
+                                               .file = first});
+        command.start(line);
+        // One that came before there was anybody to pass it on.
+        if (const int signal = signals.number()) command.signal(signal);
+        status = command.wait();
+    }
+    stopIfSignalled(Msg::stoppedInPost);
+    if (status == 0) return;
+    if (status < 0) throw failure(Msg::postNotRun, {job.output});
+    throw failure(Msg::postFailed, {std::to_string(status), job.output});
 }

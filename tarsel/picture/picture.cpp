@@ -118,19 +118,23 @@ double PictureFormat::pixelAspect() const {
 
 // --- The plan of a picture.
 
-PictureEffects::PictureEffects(const EffectOptions& options, const Source& source, int stream, bool toPng)
-    : options_(options) {
+PictureFormat pictureFormat(const Source& source, int stream) {
     const QvDecodePipe& decoder = source.decoder();
-    in_.width = intParam(decoder, stream, "width");
-    in_.height = intParam(decoder, stream, "height");
-    in_.fourcc = static_cast<unsigned>(intParam(decoder, stream, "FOURCC"));
+    PictureFormat format;
+    format.width = intParam(decoder, stream, "width");
+    format.height = intParam(decoder, stream, "height");
+    format.fourcc = static_cast<unsigned>(intParam(decoder, stream, "FOURCC"));
     const Any rate = decoder.getStreamParam(kVideo, stream, "framerate");
-    if (rate.isFramerate()) in_.rate = rate.asFramerate();
+    if (rate.isFramerate()) format.rate = rate.asFramerate();
     const Any aspect = decoder.getStreamParam(kVideo, stream, "frameAspect");
-    in_.aspect = aspect.isDouble() && aspect.asDouble() > 0
-                     ? aspect.asDouble()
-                     : static_cast<double>(in_.width) / std::max(in_.height, 1);
-    out_ = in_;
+    format.aspect = aspect.isDouble() && aspect.asDouble() > 0
+                        ? aspect.asDouble()
+                        : static_cast<double>(format.width) / std::max(format.height, 1);
+    return format;
+}
+
+PictureEffects::PictureEffects(const EffectOptions& options, const PictureFormat& in, bool toPng)
+    : options_(options), in_(in), out_(in) {
     planDeinterlace();
     planCrop();
     planRate();

@@ -20,10 +20,14 @@ struct PictureFormat {
     double pixelAspect() const;
 };
 
+// Of a video stream of a source.
+PictureFormat pictureFormat(const Source& source, int stream);
+
 class PictureEffects {
   public:
-    // `toPng`: the output is shown as RGB. Throws Failure for options that don't fit the stream.
-    PictureEffects(const EffectOptions& options, const Source& source, int stream, bool toPng);
+    // `in`: what the options work on. `toPng`: the output is shown as RGB. The options have to outlive it.
+    // Throws Failure for options that don't fit the picture.
+    PictureEffects(const EffectOptions& options, const PictureFormat& in, bool toPng);
 
     const PictureFormat& in() const { return in_; }
     const PictureFormat& out() const { return out_; }

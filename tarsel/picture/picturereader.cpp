@@ -11,7 +11,7 @@ namespace {
 }  // namespace
 
 PictureReader::PictureReader(Source& source, const EffectOptions& options)
-    : source_(source), effects_(options, source, 0, true) {
+    : source_(source), effects_(options, pictureFormat(source, 0), true) {
     inFrames_ = frames_ = source.decoder().nrFrames(0);
     if (!options.any()) return;
     frames_ = QvRatio::multyplyByRatio(inFrames_, effects_.out().rate.rate(), effects_.in().rate.rate());

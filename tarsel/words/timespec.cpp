@@ -12,7 +12,7 @@
 
 namespace {
 
-constexpr long long kTicks = 35280000;              // a second of MediaTime
+constexpr long long kTicks = MediaTime::defaultTimescale;
 constexpr long long kLongest = 1000LL * 3600 * 24;  // seconds; a bound, not a wish
 
 std::optional<long long> number(std::string_view text) {
@@ -75,7 +75,7 @@ MediaTime parseTime(std::string_view text, const std::optional<QvFramerate>& rat
     if (!text.empty() && text.back() == 'f') {
         const auto frames = number(text.substr(0, text.size() - 1));
         if (!frames || *frames < 0 || *frames > 0x7FFFFFFF) refuse();
-        return MediaTime(static_cast<long long>(*frames), needRate(), kTicks);
+        return qvInstantOf(*frames, needRate().rate());
     }
     const auto parts = split(text, ":;");
     if (parts.size() == 4) {
@@ -87,7 +87,7 @@ MediaTime parseTime(std::string_view text, const std::optional<QvFramerate>& rat
         const QvTimecode code{std::string(text).c_str()};
         counting.setDf(code.df());
         const long long frame = code.frameNr(counting, false);
-        return MediaTime(frame, counting, kTicks);
+        return qvInstantOf(frame, counting.rate());
     }
     if (text.find(';') != std::string_view::npos || parts.size() > 3) refuse();
     const auto time = clockTime(parts);
@@ -148,9 +148,8 @@ MediaTime parseInstant(std::string_view text, const std::optional<QvFramerate>& 
     const bool frames = rate && before.ends_with('f');
     const MediaTime back = parseTime(before, rate, option);
     const MediaTime at =
-        frames ? MediaTime(length.position(*rate) - back.position(*rate), *rate, kTicks) : length - back;
-    if (at < MediaTime(0LL, kTicks))
-        throw failure(Msg::timeBeforeStart, {option, text, formatTime(length.seconds())});
+        frames ? qvInstantOf(length.position(*rate) - back.position(*rate), rate->rate()) : length - back;
+    if (at < MediaTime()) throw failure(Msg::timeBeforeStart, {option, text, formatTime(length.seconds())});
     return at;
 }
 
@@ -158,7 +157,7 @@ MediaTime parseSpan(std::string_view text, const std::optional<QvFramerate>& rat
                     const MediaTime& from) {
     const MediaTime span = parseTime(text, rate, option);
     if (!rate || !text.ends_with('f')) return from + span;
-    return MediaTime(from.position(*rate) + span.position(*rate), *rate, kTicks);
+    return qvInstantOf(from.position(*rate) + span.position(*rate), rate->rate());
 }
 
 namespace {

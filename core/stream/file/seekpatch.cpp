@@ -94,11 +94,11 @@ void SeekPatch::done(int abort) {
     }
     try {
         if (!patches_.empty() && !abort) applyPatches();
-        patches_.clear();
         if (reorder_) moveBlock(name_, *reorder_, *failure_);
     } catch (const std::bad_alloc&) {
-        failure_->note(ENOMEM, "Failed to patch", name_);
+        failure_->note(ENOMEM, "No memory for a patch of", name_);
     }
+    patches_.clear();
 }
 
 }  // namespace

@@ -4,21 +4,13 @@
 
 #include "core/engine/qvutil.h"
 
-MediaTime SampleClock::timeOf(long long sample, int samplerate) {
-    const MediaTime time(sample, samplerate, MediaTime::defaultTimescale);
-    return time.position(samplerate) < sample ? time + MediaTime(1) : time;
-}
-
 void SampleClock::setRange(const MediaTime& inPoint, const MediaTime& outPoint) {
-    inStart_ = inPoint.position(inRate_);
-    inEnd_ = outPoint.position(inRate_);
-    outStart_ = inPoint.position(outRate_);
-    totalOut_ = MediaTime(inEnd_, inRate_).position(outRate_) - outStart_;
+    range_ = QvSampleRange(inPoint, outPoint, inRate_, outRate_);
 }
 
 void SampleClock::passThrough() {
     outRate_ = inRate_;
-    totalOut_ = inEnd_ - inStart_;
+    range_.out = range_.inEnd - range_.inStart;
 }
 
 long long SampleClock::samplesFor(int frames, const QvFramerate& rate) const {
@@ -31,7 +23,7 @@ bool SampleClock::wroteSilence(long long samples) {
 }
 
 double SampleClock::percent() const {
-    const long long totalIn = inEnd_ - inStart_;
+    const long long totalIn = range_.inEnd - range_.inStart;
     if (totalIn < 1) return 0.0;
     return static_cast<double>(written_ - 1) * 100.0 / static_cast<double>(totalIn) * inRate_ / outRate_;
 }

@@ -160,7 +160,7 @@ int TransALink::buildPipe(const LinkOpen& given, MediaTime& delay) {
     return QvStatus::ok;
 }
 
-MediaTime TransALink::endOfInput() const { return SampleClock::timeOf(in_.samples, in_.samplerate); }
+MediaTime TransALink::endOfInput() const { return qvInstantOf(in_.samples, QvRatio(in_.samplerate, 1)); }
 
 int TransALink::takeRange(const LinkOpen& given) {
     qv_dbg()->debug("ALink.open: input stream has %lld samples", in_.samples);

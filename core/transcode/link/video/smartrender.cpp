@@ -36,7 +36,7 @@ bool pipeAllows(const VideoJobDescription& job, const QvVProcessPipe* pipe, cons
 
 void SmartRender::negotiate(QvDecodePipe& decoder, int decStream, QvEncodePipe& encoder, int encStream,
                             const VideoJobDescription& job, const QvVProcessPipe* pipe,
-                            const FrameRange& range, bool wanted) {
+                            const QvFrameRange& range, bool wanted) {
     answer_ = Answer::unknown;
     auto* video = encoder.videoEncoder(encStream);
     QV_ASSERT(video);

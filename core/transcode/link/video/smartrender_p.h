@@ -2,7 +2,7 @@
 // passes through the link.
 #pragma once
 
-#include "core/transcode/link/video/framerange_p.h"
+#include "core/measure/mediarange.h"
 
 class QvDecodePipe;
 class QvEncodePipe;
@@ -14,7 +14,7 @@ class SmartRender {
     // Switches it off on the encoder and, when it is wanted and both sides can, on again for the range.
     // `pipe` (may be null) is the conversion of the link.
     void negotiate(QvDecodePipe& decoder, int decStream, QvEncodePipe& encoder, int encStream,
-                   const VideoJobDescription& job, const QvVProcessPipe* pipe, const FrameRange& range,
+                   const VideoJobDescription& job, const QvVProcessPipe* pipe, const QvFrameRange& range,
                    bool wanted);
     // Whether this step takes coded data. Video stream 0 of the output answers for all video links. It can
     // change from frame to frame, so it is asked in every step, unless stream 0 has shown in the first step

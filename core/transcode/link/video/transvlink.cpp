@@ -12,11 +12,11 @@
 #include "core/filter/qvprocesspipe.h"
 #include "core/filter/qvprocessutil.h"
 #include "core/job/streamformat.h"
+#include "core/measure/mediarange.h"
 #include "core/media/qvbuffer.h"
 #include "core/transcode/link/linkopen_p.h"
 #include "core/transcode/link/steplog_p.h"
 #include "core/transcode/link/video/encodertraits_p.h"
-#include "core/transcode/link/video/framerange_p.h"
 #include "core/transcode/link/video/qualitylog_p.h"
 #include "core/transcode/link/video/smartrender_p.h"
 #include "core/transcode/link/video/streamicon_p.h"
@@ -35,7 +35,7 @@ struct TransVLink::Step {
 };
 
 TransVLink::TransVLink()
-    : range_(std::make_unique<FrameRange>()), smartRender_(std::make_unique<SmartRender>()) {}
+    : range_(std::make_unique<QvFrameRange>()), smartRender_(std::make_unique<SmartRender>()) {}
 
 TransVLink::TransVLink(const TransVLink& other) : TransVLink() { *this = other; }
 
@@ -121,10 +121,10 @@ int TransVLink::readRates(const VideoFormat& in) {
 }
 
 int TransVLink::takeRange(const LinkOpen& given, const VideoFormat& in) {
-    const bool points = takePoints(given, MediaTime(in.frames, in.framerate, MediaTime::defaultTimescale));
+    const bool points = takePoints(given, qvInstantOf(in.frames, in.framerate.rate()));
     qv_dbg()->debug("%s", points ? "VLink.open: In/out points are set"
                                  : "VLink.open: In/out points constructed from total duration");
-    FrameRange range(inPoint(), outPoint(), in.framerate);
+    QvFrameRange range(inPoint(), outPoint(), in.framerate);
     qv_dbg()->debug("VLink.open: in=%f, out=%f (sec)", inPoint().seconds(), outPoint().seconds());
     qv_dbg()->debug("VLink.open: Start frame=%d, end frame=%d", range.start, range.stop);
     if (points && range.empty())

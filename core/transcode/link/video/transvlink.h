@@ -12,7 +12,7 @@ class QualityLog;
 class QvFrame;
 class QvVProcessPipe;
 class SmartRender;
-struct FrameRange;
+struct QvFrameRange;
 struct VideoFormat;
 
 // Captions that come from a decoder stream of their own.
@@ -72,7 +72,7 @@ class QV_API TransVLink : public TransLink {
     int writeFrame(QvFrame* frame);
 
     QvFramerate outFramerate_;
-    std::unique_ptr<FrameRange> range_;          // never null
+    std::unique_ptr<QvFrameRange> range_;        // never null
     std::unique_ptr<SmartRender> smartRender_;   // never null
     std::unique_ptr<QualityLog> qualityLog_;     // null unless logging
     std::unique_ptr<QvVProcessPipe> videoPipe_;  // null when no processing is needed

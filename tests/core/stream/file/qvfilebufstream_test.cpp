@@ -1,6 +1,7 @@
 #include "core/stream/file/qvfilebufstream.h"
 
 #include "tests/core/stream/streamtools.h"
+#include "tests/support/failing_memory.h"
 
 namespace {
 
@@ -170,6 +171,22 @@ TEST_F(FileStream, PatchesGoInWhenTheFileIsClosed) {
     stream.destroy(0);
     EXPECT_EQ(bytes(), "0123") << "nothing after the patch that failed";
     EXPECT_EQ(stream.ioError(), EINVAL);
+}
+
+// A file without its patches would pass for a complete one.
+TEST_F(FileStream, PatchesThatGetNoMemoryAreAFailure) {
+    bool reached = true;
+    for (int nth = 1; reached; ++nth) {
+        bufstream* in = begin();
+        put(in, "0123");
+        tell(in, BUF_SEEK_INFO, BufSeekInfo{0, "x", 1});
+        {
+            const FailingMemory memory(nth);
+            stream.destroy(0);
+            reached = FailingMemory::failed();
+        }
+        EXPECT_TRUE(bytes() == "x123" || stream.ioError() == ENOMEM) << nth;
+    }
 }
 
 // A pipe has nothing to go back to, so what wants to is a failure and not a file with holes.

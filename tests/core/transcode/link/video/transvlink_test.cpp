@@ -96,6 +96,12 @@ TEST(TransVLink, PointsChooseTheFrames) {
         EXPECT_EQ(job.run(), 0);
         EXPECT_EQ(job.encoder.video.numbers, range(row.first, row.first + row.count)) << row.first;
     }
+    // The end of the stream lies between two ticks.
+    const QvFramerate odd(QvRatio(151, 20));
+    Job whole(20, odd, odd);
+    ASSERT_EQ(whole.open(), 0);
+    EXPECT_EQ(whole.run(), 0);
+    EXPECT_EQ(whole.encoder.video.numbers, range(0, 20));
 }
 
 TEST(TransVLink, FailuresComeOut) {

@@ -1,0 +1,20 @@
+#include "tarsel/job/inputlengths.h"
+
+#include "tarsel/host/files.h"
+#include "tarsel/words/messages.h"
+
+InputLengths::InputLengths(std::span<const std::unique_ptr<Source>> sources) {
+    for (const auto& source : sources)
+        if (source->isFile()) rows_.push_back({source->name(), fileBytes(source->name())});
+}
+
+void InputLengths::check(bool again) const {
+    for (const Row& row : rows_) {
+        const long long now = fileBytes(row.name);
+        if (now < 0 || now >= row.bytes) continue;
+        const std::string left = std::to_string(now), all = std::to_string(row.bytes);
+        const Failure shrank = failure(Msg::inputShrank, {row.name, left, all});
+        if (!again) throw Failure(shrank);
+        throw InputShrank(shrank, lineOf(Msg::inputShrankTaken, {row.name, left, all}));
+    }
+}

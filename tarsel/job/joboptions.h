@@ -1,0 +1,19 @@
+// What the user asks of a transcode: what it does, and how it is run.
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include "tarsel/host/outputs/outputs.h"
+#include "tarsel/job/plan/planoptions.h"
+#include "tarsel/job/progress.h"
+
+struct JobOptions : PlanOptions {
+    std::string raw;   // format of a raw input
+    std::string post;  // command that is run afterwards
+    ProgressMode progress;
+    OutputPolicy policy{false};
+    bool dryRun = false, quiet = false;
+    bool strict = false;                // warnings are failures
+    std::vector<std::string> warnings;  // of earlier attempts
+};

@@ -1,0 +1,33 @@
+#include "tarsel/job/plan/jobinput.h"
+
+QvRatio InputStream::rate() const {
+    return type == qvVideoStream ? picture.rate.rate() : QvRatio(sound.samplerate, 1);
+}
+
+std::optional<QvFramerate> JobInput::frameRate() const {
+    if (video.empty()) return std::nullopt;
+    return video.front().picture.rate;
+}
+
+JobInput readInput(const Source& source) {
+    JobInput input;
+    input.name = source.name();
+    input.damage = source.damage();
+    input.duration = source.duration();
+    QvDecodePipe& decoder = source.decoder();
+    for (int i = 0; i < decoder.nrStreams(qvVideoStream); ++i) {
+        InputStream stream;
+        stream.units = decoder.nrFrames(i);
+        stream.picture = pictureFormat(source, i);
+        input.video.push_back(stream);
+    }
+    for (int i = 0; i < decoder.nrStreams(qvAudioStream); ++i) {
+        const auto ask = [&](const char* name) { return decoder.getAudioParam(i, name).asInt32(0); };
+        InputStream stream;
+        stream.type = qvAudioStream;
+        stream.units = decoder.nrSamples(i);
+        stream.sound = {ask("samplerate"), ask("channels"), ask("bitsPerSample")};
+        input.audio.push_back(stream);
+    }
+    return input;
+}

@@ -1,0 +1,185 @@
+#include "tarsel/job/plan/jobplan.h"
+
+#include <algorithm>
+#include <new>
+
+#include "tarsel/job/plan/filters.h"
+#include "tarsel/job/plan/lengths.h"
+#include "tarsel/job/plan/points.h"
+#include "tarsel/words/messages.h"
+#include "tarsel/words/timespec.h"
+
+namespace {
+
+// By --no-video and --no-audio.
+bool unwanted(const PlanOptions& options, int type) {
+    return type == qvVideoStream ? options.noVideo : options.noAudio;
+}
+
+int count(const JobPlan& plan, int type) {
+    return static_cast<int>(std::count_if(plan.streams.begin(), plan.streams.end(),
+                                          [&](const auto& s) { return s.type == type; }));
+}
+
+// A cut input is refused unless the user takes what is there.
+void checkDamage(JobPlan& plan, bool acceptPartial) {
+    for (const JobInput& input : plan.inputs) {
+        if (input.damage.empty()) continue;
+        if (!acceptPartial) throw failure(Msg::inputDamaged, {input.name, input.damage});
+        plan.warnings.push_back(lineOf(Msg::inputDamagedTaken, {input.name, input.damage}));
+    }
+}
+
+SoundFormat soundFormat(const PlanOptions& options, const SoundFormat& in) {
+    return {options.samplerate.value_or(in.samplerate), options.channels.value_or(in.channels),
+            options.bits.value_or(in.bits)};
+}
+
+void takeStreams(JobPlan& plan, const PlanOptions& options) {
+    for (size_t input = 0; input < plan.inputs.size(); ++input)
+        for (const int type : {qvVideoStream, qvAudioStream}) {
+            if (unwanted(options, type) || (type == qvVideoStream && plan.output.kind == OutputKind::wav))
+                continue;
+            if (plan.output.takesOneStream() && !plan.streams.empty()) continue;
+            const auto& streams = plan.inputs[input].streams(type);
+            for (size_t i = 0; i < streams.size(); ++i) {
+                PlannedStream stream;
+                stream.type = type;
+                stream.number = count(plan, type);
+                stream.part.input = static_cast<int>(input);
+                stream.part.stream = static_cast<int>(i);
+                stream.picture = streams[i].picture;
+                stream.sound = soundFormat(options, streams[i].sound);
+                plan.streams.push_back(std::move(stream));
+            }
+        }
+}
+
+void checkKinds(JobPlan& plan, const PlanOptions& options) {
+    OutputForm& output = plan.output;
+    if (plan.streams.empty() && (options.noVideo || options.noAudio))
+        throw failure(Msg::inputUnwanted, {options.noAudio ? "--no-audio" : "--no-video", output.name});
+    if (plan.streams.empty())
+        throw failure(output.kind == OutputKind::wav ? Msg::inputNoSound : Msg::inputNoStreams,
+                      {output.name});
+    if (output.kind == OutputKind::byInput) output.kind = plan.hasVideo() ? OutputKind::raw : OutputKind::wav;
+    const bool sound = output.kind == OutputKind::wav || output.kind == OutputKind::nothing;
+    if (sound || plan.hasVideo()) return;
+    if (options.noVideo) throw failure(Msg::inputUnwanted, {"--no-video", output.name});
+    throw failure(Msg::inputNoPicture, {output.name});
+}
+
+// A number that was asked for is refused by name where the encoder is set up.
+void checkChannels(const JobPlan& plan, const PlanOptions& options) {
+    constexpr int most = 32;  // of an output
+    for (const PlannedStream& s : plan.streams)
+        if (!s.isVideo() && !options.channels && s.sound.channels > most)
+            throw failure(Msg::outputChannels,
+                          {plan.output.name, std::to_string(most), std::to_string(s.sound.channels)});
+}
+
+// What has a file of its own is one, or is numbered as the user says.
+void checkCounts(const JobPlan& plan) {
+    const OutputForm& output = plan.output;
+    if (!output.isFiles() || output.kind == OutputKind::avi) return;
+    for (const int type : {qvVideoStream, qvAudioStream}) {
+        const int streams = count(plan, type);
+        if (streams < 2) continue;
+        const char* what = type == qvVideoStream ? "picture" : "sound";
+        if (output.kind == OutputKind::pictures || output.splitChannels)
+            throw failure(Msg::outputTakesOne, {output.name, what, std::to_string(streams)});
+        if (!output.numbered)
+            throw failure(Msg::outputHoldsOne,
+                          {output.name, what, std::to_string(streams), numberedLike(output.name)});
+    }
+}
+
+// As captions, of which raw pictures hold none.
+void warnOfUnused(JobPlan& plan, const PlanOptions& options) {
+    const auto isLeft = [&](const JobInput& input, int type) {
+        return unwanted(options, type) && !input.streams(type).empty();
+    };
+    for (const JobInput& input : plan.inputs)
+        if (!isLeft(input, qvVideoStream) && !isLeft(input, qvAudioStream) &&
+            std::none_of(plan.streams.begin(), plan.streams.end(),
+                         [&](const auto& s) { return &plan.input(s) == &input; }))
+            plan.warnings.push_back(lineOf(Msg::inputUnused, {input.name}));
+}
+
+std::string formatOf(const PlannedStream& stream) {
+    if (stream.isVideo())
+        return std::to_string(stream.picture.width) + "x" + std::to_string(stream.picture.height) + " " +
+               fourccText(stream.picture.fourcc) + " " + formatRate(stream.picture.rate);
+    return std::to_string(stream.sound.samplerate) + " Hz, " + std::to_string(stream.sound.channels) +
+           " ch, " + std::to_string(stream.sound.bits) + " bit";
+}
+
+}  // namespace
+
+long long PlannedStream::bytes(long long units) const {
+    if (!isVideo()) return units * sound.channels * ((sound.bits + 7) / 8);
+    QvFrame shape;
+    if (shape.init(picture.fourcc, picture.width, picture.height) != QvStatus::ok) throw std::bad_alloc();
+    return units * shape.total_bytes();
+}
+
+ProcessParams PlannedStream::params() const {
+    ProcessParams params;
+    if (!part.whole) params.setInOutPoints(InOutPoints(part.in, part.out));
+    if (!filters.empty()) params.setFilters(filters);
+    return params;
+}
+
+bool JobPlan::hasVideo() const { return count(*this, qvVideoStream) > 0; }
+
+const JobInput& JobPlan::input(const PlannedStream& stream) const {
+    return inputs[static_cast<size_t>(stream.part.input)];
+}
+
+const InputStream& JobPlan::source(const PlannedStream& stream) const {
+    return input(stream).streams(stream.type)[static_cast<size_t>(stream.part.stream)];
+}
+
+long long JobPlan::bytes() const {
+    long long total = 0;
+    for (const PlannedStream& stream : streams) total += stream.bytes(stream.expected);
+    return total;
+}
+
+JobPlan planJob(const PlanOptions& options, const OutputForm& output, std::vector<JobInput> inputs) {
+    JobPlan plan;
+    plan.output = output;
+    plan.inputs = std::move(inputs);
+    checkDamage(plan, options.acceptPartial);
+    takeStreams(plan, options);
+    EffectOptions effects = options.effects;
+    effects.pixel = output.pixel;
+    FilterPlanner filters(plan, effects);
+    checkKinds(plan, options);
+    checkCounts(plan);
+    checkChannels(plan, options);
+    warnOfUnused(plan, options);
+    planPoints(plan, {options.from, options.to, options.duration});
+    planFrames(plan);
+    filters.plan();
+    planSamples(plan);
+    return plan;
+}
+
+std::string planText(const JobPlan& plan) {
+    std::string text;
+    for (const JobInput& input : plan.inputs)
+        text += "input   " + inQuotes(input.name) + "  " + formatTime(input.duration) + "\n";
+    for (const PlannedStream& stream : plan.streams) {
+        text += std::string("stream  ") + (stream.isVideo() ? "video " : "audio ") +
+                std::to_string(stream.part.stream) + " of " + inQuotes(plan.input(stream).name) + ", " +
+                formatTime(stream.part.in.seconds()) + " to " + formatTime(stream.part.out.seconds()) + "\n";
+        for (const std::string& filter : stream.chain) text += "filter  " + filter + "\n";
+        text += std::string("encoder ") + stream.encoder() + ": " + formatOf(stream) + "\n";
+        text += "expect  " + std::to_string(stream.expected) + " " + stream.unit() + ", " +
+                std::to_string(stream.bytes(stream.expected)) + " bytes\n";
+    }
+    const bool nowhere = plan.output.place == OutputPlace::nowhere;
+    return text + "output  " + (nowhere ? "nothing" : inQuotes(plan.output.name)) + " by " +
+           plan.output.muxer() + ", " + formatBytes(plan.bytes()) + "\n";
+}

@@ -1,0 +1,63 @@
+// What a transcode does, as a plain value: which part of which stream is read, which filters it passes, and
+// what is written, in which format and how much of it. Nothing in it is open, so that a plan can be made and
+// printed without a file; JobRun carries it out.
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include "tarsel/job/plan/jobinput.h"
+#include "tarsel/job/plan/outputform.h"
+#include "tarsel/job/plan/planoptions.h"
+#include "tarsel/picture/picture.h"
+
+// The part of a stream that is taken.
+struct StreamPart {
+    int input = 0;      // of JobPlan::inputs
+    int stream = 0;     // among those of its type there
+    bool whole = true;  // no points were asked for
+    MediaTime in, out;  // the first instant that is taken, and the first one that is not
+};
+
+// One stream of the output.
+struct PlannedStream {
+    int type = qvVideoStream;  // or qvAudioStream
+    int number = 0;            // among those of its type in the output
+    StreamPart part;
+    // The format that is written.
+    PictureFormat picture;           // of video
+    SoundFormat sound;               // of audio
+    FiltersState filters;            // that the user asks for
+    std::vector<std::string> chain;  // a line for each filter, to be shown
+
+    long long expected = 0;  // frames or samples of the output
+    MediaTime skipped;       // audio: of the input, for a filter that lets the sound come earlier
+    long long own = 0;       // audio: samples of the output that the part itself has
+    long long frame = 0;     // audio: most samples that belong to one frame of the picture; 0 without one
+
+    bool isVideo() const { return type == qvVideoStream; }
+    const char* encoder() const { return isVideo() ? "rawvenc" : "rawaenc"; }
+    const char* unit() const { return isVideo() ? "frames" : "samples"; }
+    long long bytes(long long units) const;  // without headers
+    ProcessParams params() const;
+};
+
+struct JobPlan {
+    OutputForm output;
+    std::vector<JobInput> inputs;
+    std::vector<PlannedStream> streams;
+    FilterFiles filterFiles;
+    std::vector<std::string> warnings;
+
+    bool hasVideo() const;
+    const JobInput& input(const PlannedStream& stream) const;
+    // The one that `stream` is a part of.
+    const InputStream& source(const PlannedStream& stream) const;
+    long long bytes() const;  // that are written, without headers
+};
+
+// Throws Failure for what can't be done. The engine has to be started, for its filters.
+JobPlan planJob(const PlanOptions& options, const OutputForm& output, std::vector<JobInput> inputs);
+
+// What --dry-run prints: a line for each input, stream, filter, encoder and length, and one for the output.
+std::string planText(const JobPlan& plan);

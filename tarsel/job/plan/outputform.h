@@ -1,0 +1,44 @@
+// What an output is: the format that its name or --format means, and how its files are named.
+#pragma once
+
+#include <optional>
+#include <string>
+
+#include "tarsel/job/plan/planoptions.h"
+#include "tarsel/words/numberedname.h"
+
+enum class OutputKind {
+    raw,
+    wav,
+    pictures,  // a sequence of PNG files
+    avi,
+    nothing,
+    byInput,  // a stream whose name does not say it: raw pictures, or WAV where there is no picture
+};
+
+enum class OutputPlace {
+    nowhere,
+    files,
+    stream,
+    nullDevice,  // a stream that takes anything, even several streams, and keeps nothing
+};
+
+struct OutputForm {
+    OutputKind kind = OutputKind::nothing;
+    OutputPlace place = OutputPlace::nowhere;
+    std::string name;   // for messages: as it was given, or what is in its place
+    std::string pixel;  // pixel format that was asked for, or that the name says; empty for that of the input
+    std::optional<NumberedName> numbered;
+    bool splitChannels = false;  // a file for each channel
+
+    bool isFiles() const { return place == OutputPlace::files; }
+    bool takesOneStream() const { return place == OutputPlace::stream; }
+    bool writesNothing() const { return kind == OutputKind::nothing || place == OutputPlace::nullDevice; }
+    // The engine's modules and the extension of its first file.
+    const char* muxer() const;
+    const char* extension(bool hasVideo) const;
+};
+
+// The form of an output that is `place`. Throws Failure for a name or a format that means nothing, or that
+// does not fit the place.
+OutputForm outputForm(const PlanOptions& options, OutputPlace place);

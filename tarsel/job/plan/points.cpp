@@ -1,0 +1,78 @@
+#include "tarsel/job/plan/points.h"
+
+#include <algorithm>
+
+#include "tarsel/job/plan/jobplan.h"
+#include "tarsel/words/messages.h"
+#include "tarsel/words/timespec.h"
+
+namespace {
+
+class Points {
+  public:
+    Points(JobPlan& plan, const PointOptions& options)
+        : plan_(plan), options_(options), leading_(leadingOf(plan)), whole_(plan.source(leading_).end()) {}
+
+    void set(PlannedStream& stream) {
+        const JobInput& input = plan_.input(stream);
+        const MediaTime length = plan_.source(stream).end();
+        StreamPart& part = stream.part;
+        part.whole = options_.from.empty() && options_.to.empty() && options_.duration.empty();
+        part.in = MediaTime();
+        part.out = length;
+        parse(part, rateFor(input));
+        check(part, input, length);
+        if (part.out <= length) return;
+        if (stream.isVideo() || !plan_.hasVideo()) warn(input, length);
+        part.out = length;
+    }
+
+  private:
+    static const PlannedStream& leadingOf(const JobPlan& plan) {
+        const auto picture =
+            std::find_if(plan.streams.begin(), plan.streams.end(), [](const auto& s) { return s.isVideo(); });
+        return picture != plan.streams.end() ? *picture : plan.streams.front();
+    }
+
+    // Frames beside a sound of its own file are those of the picture.
+    std::optional<QvFramerate> rateFor(const JobInput& input) const {
+        const auto own = input.frameRate();
+        return own || !leading_.isVideo() ? own : plan_.input(leading_).frameRate();
+    }
+
+    void parse(StreamPart& part, const std::optional<QvFramerate>& rate) const {
+        if (!options_.from.empty()) part.in = parseInstant(options_.from, rate, "--from", whole_);
+        if (!options_.to.empty()) part.out = parseInstant(options_.to, rate, "--to", whole_);
+        if (!options_.duration.empty()) part.out = parseSpan(options_.duration, rate, "--duration", part.in);
+    }
+
+    void check(const StreamPart& part, const JobInput& input, const MediaTime& length) const {
+        if (part.out <= part.in && !options_.to.empty())
+            throw failure(Msg::toNotAfter, {options_.to, start()});
+        if (part.out <= part.in && !options_.duration.empty())
+            throw failure(Msg::durationNone, {options_.duration});
+        if (part.in >= length && !options_.from.empty())
+            throw failure(Msg::fromAfterEnd, {options_.from, input.name, formatTime(length.seconds())});
+    }
+
+    void warn(const JobInput& input, const MediaTime& length) {
+        const std::string end = formatTime(length.seconds());
+        plan_.warnings.push_back(
+            options_.to.empty() ? lineOf(Msg::durationAfterEnd, {options_.duration, start(), input.name, end})
+                                : lineOf(Msg::toAfterEnd, {options_.to, input.name, end}));
+    }
+
+    std::string start() const { return options_.from.empty() ? "the start" : "--from " + options_.from; }
+
+    JobPlan& plan_;
+    const PointOptions& options_;
+    const PlannedStream& leading_;
+    MediaTime whole_;  // the end of the leading stream
+};
+
+}  // namespace
+
+void planPoints(JobPlan& plan, const PointOptions& options) {
+    Points points(plan, options);
+    for (PlannedStream& stream : plan.streams) points.set(stream);
+}

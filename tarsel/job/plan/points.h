@@ -1,0 +1,16 @@
+// Which part of each stream a job takes.
+#pragma once
+
+#include <string>
+
+struct JobPlan;
+
+// As they were given; empty when they were not.
+struct PointOptions {
+    std::string from, to, duration;
+};
+
+// Sets the part of each stream of the plan. Times from the end count from that of the picture, so that all
+// streams keep together; what lies after the end of a stream is a warning. Throws Failure for points that
+// leave nothing.
+void planPoints(JobPlan& plan, const PointOptions& options);
