@@ -34,14 +34,15 @@ TEST_F(Options, TimesFromTheEndKeepStreamsTogether) {
                 wavPart(contents("clip.wav"), "data").substr(3 * 44100 * 4, 44100 * 4));
 }
 
-refuses({"transcode", "testgen:size=64x48", "-o", "x.raw"},
-        {{{"--size", "-1x-1"}, {"--size: '-1x-1' is not a size"}},
-         {{"--size", "10x-2"}, {"--size"}},
-         {{"--fit", "10"}, {"--fit: '10' is not a box"}},
-         {{"--fit", "10x10,pad"}, {"--fit", "WxH,bars"}},
-         {{"--fit", "10x60000,bars"}, {"--fit", "too far"}},
-         {{"--fit", "10x60000,crop"}, {"--fit", "too far"}},
-         {{"--fit", "10x10", "--size", "10x10"}, {"--size: --fit contradicts it"}}});
+TEST_F(Options, SizesThatMeanNothing) {
+    refuses({"transcode", "testgen:size=64x48", "-o", "x.raw"},
+            {{{"--size", "-1x-1"}, {"--size: '-1x-1' is not a size"}},
+             {{"--size", "10x-2"}, {"--size"}},
+             {{"--fit", "10"}, {"--fit: '10' is not a box"}},
+             {{"--fit", "10x10,pad"}, {"--fit", "WxH,bars"}},
+             {{"--fit", "10x60000,bars"}, {"--fit", "too far"}},
+             {{"--fit", "10x60000,crop"}, {"--fit", "too far"}},
+             {{"--fit", "10x10", "--size", "10x10"}, {"--size: --fit contradicts it"}}});
 }
 
 // A row of the luma of the first frame.
