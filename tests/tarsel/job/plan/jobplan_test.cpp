@@ -223,7 +223,7 @@ TEST_F(Plan, WhichStreamsAreTaken) {
         {"o.raw", OutputPlace::files, false, false, "o_%d.raw", nullptr, nullptr},
         {"o.png", OutputPlace::files, false, false, "picture", nullptr, nullptr},
         {"o.avi", OutputPlace::files, true, true, "--no-audio", nullptr, nullptr},
-        {"o.raw", OutputPlace::files, true, false, "no input has a picture", nullptr, nullptr},
+        {"o.raw", OutputPlace::files, true, false, "--no-video", nullptr, nullptr},
     };
     const std::vector<JobInput> inputs = {
         input("one", {video("25", 4)}, {sound(44100, 7056)}),
