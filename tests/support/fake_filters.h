@@ -66,6 +66,7 @@ class FakeVideoFilter : public AnyParamFilter<QvVideoFilter> {
     using AnyParamFilter::AnyParamFilter;
 
     int write(QvFrame& frame) override {
+        if (const int refused = known.getInt32("refuseWrite", 0)) return refused;
         out = frame;
         left = copies ? copies(frame.frameNr) : 1;
         return 0;

@@ -375,11 +375,16 @@ int TransVLink::_processOneFrame() {
         }
         videoPipe_->write(*frame);
         result = videoPipe_->process(nullptr, 0);
-        // A filter without memory may lose every frame from here on.
-        if (result == QvStatus::needsInput && videoPipe_->errorCode() == QvStatus::outOfMemory)
-            return QvStatus::outOfMemory;
+        if (result == QvStatus::needsInput && losesAll()) return videoPipe_->errorCode();
     }
     return result;
+}
+
+// A filter that fails may lose every frame, and there are decoders without an end.
+bool TransVLink::losesAll() const {
+    const int error = videoPipe_->errorCode();
+    if (error == QvStatus::ok) return false;
+    return error == QvStatus::outOfMemory || static_cast<int>(videoPipe_->framesIn()) >= range_->in;
 }
 
 // Where a halving takes one frame more than the stream has, the last one serves twice; otherwise null.

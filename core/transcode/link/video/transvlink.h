@@ -67,6 +67,7 @@ class QV_API TransVLink : public TransLink {
     void endStep(Step& step);
     void repeatLast(Step& step);
     int _processOneFrame();
+    bool losesAll() const;
     QvFrame* completePair();
     void feedMetaSources(QvFrame* frame);
     int writeFrame(QvFrame* frame);

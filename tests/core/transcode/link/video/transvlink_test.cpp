@@ -140,6 +140,18 @@ TEST(TransVLink, FailuresComeOut) {
     }
 }
 
+// The input may have no end.
+TEST(TransVLink, AFilterThatTakesNoFrameEndsTheJob) {
+    Job job(1000);
+    job.params.set("inOutPoints", pointsOf(MediaTime(0.0), MediaTime(0.4)));
+    job.params.set("effects",
+                   customFilters(AnyVector(Any(AnyDict("name", "logo", "_on", 1, "refuseWrite", -7)))));
+    ASSERT_EQ(job.open(), 0);
+    EXPECT_EQ(job.run(), -7);
+    EXPECT_EQ(job.decoder.read, 10);
+    EXPECT_TRUE(job.encoder.video.numbers.empty());
+}
+
 TEST(TransVLink, TruncatedInputEndsWithoutError) {
     Job job(10);
     job.decoder.truncatedAt = 4;
