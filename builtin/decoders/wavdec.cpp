@@ -205,6 +205,7 @@ int WavDec::open() {
     otherChunks_.clear();
     if (extended) readWavChunks(file, header, chunks_, otherChunks_);
     auto stream = std::make_unique<WavStream>(std::move(file), header, extended);
+    if (!stream->pcm->inited()) return setError(QvStatus::outOfMemory, "No memory for samples");
     if (const int result = stream->seek(0); result != QvStatus::ok)
         return setError(QvStatus::cannotParse, "Failed to open file for reading");
     addStream(std::move(stream));

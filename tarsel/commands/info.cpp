@@ -37,7 +37,7 @@ void describeText(const AnyDict& p, Json& stream) {
 Json describeStream(const QvDecodePipe& decoder, int type, int number) {
     AnyDict p;
     decoder.getStreamParams(type, number, p);
-    Json stream;
+    Json stream = Json::object();
     stream["type"] = type == 1 ? "video" : type == 2 ? "audio" : "subpicture";
     stream["number"] = number;
     if (p.get("codec").isText()) stream["codec"] = text(p.get("codec"));
@@ -104,7 +104,7 @@ void describeWords(const QvDecodePipe& decoder, Json& file) {
 }
 
 Json describe(const Source& source) {
-    Json file;
+    Json file = Json::object();
     file["file"] = validUtf8(source.name());
     file["decoder"] = source.decoder().name();
     if (source.bytes() >= 0) file["bytes"] = source.bytes();

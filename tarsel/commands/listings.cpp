@@ -40,7 +40,7 @@ constexpr Output kOutputs[] = {
 };
 
 Json formats() {
-    Json result;
+    Json result = Json::object();
     Json inputs = Json::array();
     for (int i = 0; i < qv_registry()->nrModules(0); ++i) {
         QvModule& module = *qv_registry()->module(i);

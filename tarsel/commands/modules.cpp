@@ -41,7 +41,7 @@ Json parameters(const QvCodec& codec) {
         const AnyDict& row = described.asDict();
         if (isInternal(row)) continue;
         const std::string type = row.getString("type", ""), help = row.getString("help", "");
-        Json parameter;
+        Json parameter = Json::object();
         parameter["name"] = row.getString("name", "");
         parameter["type"] = type == "Invalid" ? "" : type;
         parameter["unit"] = row.getString("unit", "");
@@ -57,7 +57,7 @@ Json parameters(const QvCodec& codec) {
 
 Json describe(QvModule& module) {
     const std::unique_ptr<QvCodec> codec(qv_registry()->newCodec(module.name()));
-    Json row;
+    Json row = Json::object();
     row["name"] = module.name();
     row["kind"] = kindName(moduleKind(module));
     row["description"] = module.desc();

@@ -106,7 +106,7 @@ Json hundredths(double value) {
 }
 
 Json objectOf(const char* event, const JobFigures& f) {
-    Json object;
+    Json object = Json::object();
     object["schema"] = kSchema;
     object["event"] = event;
     object["state"] = f.state;
@@ -272,7 +272,7 @@ void tell(Level level, const std::string& line) {
         return;
     }
     if (c.ended) return;
-    Json object;
+    Json object = Json::object();
     object["schema"] = kSchema;
     object["event"] = "message";
     object["level"] = level == Level::warning ? "warning" : "note";

@@ -174,15 +174,24 @@ mode_t modeOf(va_list& arguments) {
     return mode;
 }
 
+// As the operators do, those that answer with null included.
+void* refused() {
+    try {
+        if (const std::new_handler handler = std::get_new_handler()) handler();
+    } catch (const std::bad_alloc&) {
+    }
+    return nullptr;
+}
+
 void* take(size_t size, const void* caller) {
     NEXT(malloc);
-    return hit(Kind::alloc, caller) ? nullptr : next(size ? size : 1);
+    return hit(Kind::alloc, caller) ? refused() : next(size ? size : 1);
 }
 
 void* takeAligned(size_t size, std::align_val_t align, const void* caller) {
     NEXT(aligned_alloc);
     const size_t step = static_cast<size_t>(align);
-    return hit(Kind::alloc, caller) ? nullptr : next(step, (size + step - 1) / step * step);
+    return hit(Kind::alloc, caller) ? refused() : next(step, (size + step - 1) / step * step);
 }
 
 void* orThrow(void* block) {
