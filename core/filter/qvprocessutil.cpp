@@ -127,7 +127,7 @@ QvAProcessPipe* QvProcessUtil::createAudioPipe(const AudioJobDescription& job, M
 }
 
 bool QvProcessUtil::applyStreamReport(QvAProcessPipe* pipe, QvDecodePipe* decoder, int decoderStream,
-                                       long long from, long long to, const QvReadWatch& watch) {
+                                      long long from, long long to, const QvReadWatch& watch) {
     std::vector<int> needs;
     for (int i = 0; i < pipe->nrFilters(); ++i) needs.push_back(reportNeed(*pipe->filter(i)));
     const int most = needs.empty() ? QvReportNeed::none : *std::max_element(needs.begin(), needs.end());

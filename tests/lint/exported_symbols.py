@@ -9,7 +9,7 @@ OWN = re.compile(r"""^(?:typeinfo\ (?:name\ )?for\ |vtable\ for\ |VTT\ for\ |gua
                         TRefList|InOutPoints|FiltersState|ProcessParams|MetaProcessParams|MetaVHelper|AudioMuxer|
                         BaseMuxer|BaseDecodePipe|DPipe|CodecCompat|PresetGroup|Generator|init_wrapper|cleanup_wrapper|
                         core_library_path|path_separator|execute_process|available_codepages|get_folder_|debug_trace|
-                        operator|bufstream|buf_|fifo_|VideoJobDescription|AudioJobDescription|VideoFormat|AudioFormat|YSwingCorrect|frame_tt|
+                        operator|bufstream|buf_|fifo_|VideoJobDescription|AudioJobDescription|AudioConversion|VideoFormat|AudioFormat|YSwingCorrect|frame_tt|
                         FilterGroup|Bufstream|Fifo|codepage_name|SubImporter|CCStream|WavStream|init_|metadata_)""", re.X)
 strange = [line.strip() for line in sys.stdin if line.strip() and not OWN.match(line.strip())]
 for line in strange[:40]:
