@@ -1,6 +1,7 @@
 #include <atomic>
 #include <new>
 
+#include "core/arch/threadend_p.h"
 #include "core/document/blockmemory_p.h"
 
 #if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
@@ -43,14 +44,23 @@ struct alignas(alignment) Head {
     Block* block;
 };
 
-struct Current {
-    Block* block = nullptr;
-    ~Current() {
-        if (block) block->drop();
-        block = nullptr;
+thread_local Block* current = nullptr;
+
+void dropCurrent(void* block) {
+    current = nullptr;
+    static_cast<Block*>(block)->drop();
+}
+
+// Makes `fresh` the block that this thread cuts from.
+void useBlock(Block* fresh) {
+    static const ThreadEnd threadEnd(dropCurrent);
+    if (!threadEnd.set(fresh)) {
+        fresh->drop();
+        throw std::bad_alloc();
     }
-};
-thread_local Current current;
+    if (current) current->drop();
+    current = fresh;
+}
 
 void* place(void* memory, Block* block) { return new (memory) Head{block} + 1; }
 
@@ -59,12 +69,8 @@ void* place(void* memory, Block* block) { return new (memory) Head{block} + 1; }
 void* take(std::size_t size) {
     const std::size_t whole = sizeof(Head) + aligned(size);
     if (whole > blockSize / 8) return place(::operator new(whole), nullptr);
-    if (!current.block || current.block->used + whole > blockSize) {
-        auto* const fresh = new (::operator new(blockSize)) Block;
-        if (current.block) current.block->drop();
-        current.block = fresh;
-    }
-    Block* const block = current.block;
+    if (!current || current->used + whole > blockSize) useBlock(new (::operator new(blockSize)) Block);
+    Block* const block = current;
     block->users.fetch_add(1, std::memory_order_relaxed);
     void* const piece = place(reinterpret_cast<char*>(block) + block->used, block);
     block->used += whole;
