@@ -117,14 +117,14 @@ CCStream::CCStream() : DPipeStream(qvSubpicStream) {}
 
 void CCStream::read(long long n, const QvFramerate& rate, QvCcData& result) const {
     const MediaTime from = MediaTime(n, rate, MediaTime::defaultTimescale) + timeOffset;
-    const MediaTime behind = MediaTime(n + 1, rate, MediaTime::defaultTimescale) + timeOffset;
+    const MediaTime end = MediaTime(n + 1, rate, MediaTime::defaultTimescale) + timeOffset;
     result.clear();
     for (std::size_t field = 0; field < fields; ++field) {
         if (!hasData[field]) continue;
         const auto pairs = data[field].pairs();
         auto pair = std::lower_bound(pairs.begin(), pairs.end(), from,
                                      [](const QvCcBytePair& p, const MediaTime& t) { return p.time < t; });
-        for (; pair != pairs.end() && pair->time < behind; ++pair) result.append(*pair);
+        for (; pair != pairs.end() && pair->time < end; ++pair) result.append(*pair);
     }
     result.shiftTimes(MediaTime() - timeOffset);
 }

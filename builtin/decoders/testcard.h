@@ -23,7 +23,7 @@ class CardText {
     virtual void draw(QvFrame& frame, int x, int y, const char* text) = 0;
 };
 
-// Everything that stands still; the rate is that of the frame. frameAspect: width to height as shown.
+// Everything that does not move; the rate is that of the frame. frameAspect: width to height as shown.
 // `text` may be null.
 void drawTestCard(QvFrame& frame, double frameAspect, CardText* text);
 

@@ -126,13 +126,13 @@ int WavStream::readConverted(int count) {
     const long long before = clipped_;
     int done = 0;
     while (done < count) {
-        const long long position = pcm->position() + done, behind = counted_ - position;
+        const long long position = pcm->position() + done, left = counted_ - position;
         auto piece = std::min<long long>(count - done, static_cast<long long>(stored_.size() / frameBytes));
-        if (behind > 0) piece = std::min(piece, behind);
+        if (left > 0) piece = std::min(piece, left);
         const std::size_t got = file_.read(stored_.data(), frameBytes, static_cast<std::size_t>(piece));
         if (header_.bigEndian) wav::swapBytes(stored_.data(), header_.valueBytes(), got * channels);
         const std::size_t clipped = got > 0 ? convert_(pcm->ptr(done), stored_.data(), got * channels) : 0;
-        if (behind <= 0) {
+        if (left <= 0) {
             clipped_ += static_cast<long long>(clipped);
             counted_ = position + static_cast<long long>(got);
         }

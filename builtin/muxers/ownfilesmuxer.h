@@ -3,7 +3,7 @@
 
 #include "core/encode/basemuxer.h"
 
-// As long as a sink is attached, it is told that it has nothing to write.
+// An attached sink is informed that it has nothing to write.
 class OwnFilesMuxer : public BaseMuxer {
   public:
     int attachOutStream(QvBufStream* stream) override;

@@ -104,7 +104,7 @@ void QvAf::askRateConverter(Member& member, int missing) {
     member.wanted = wanted;
 }
 
-// All that a filter holds goes to the one behind it.
+// All that a filter holds goes to the next one.
 int QvAf::moveOn(std::size_t from, int missing) {
     auto& filter = *filters_[from].filter;
     auto& next = filters_[from + 1];

@@ -93,7 +93,7 @@ int QvVf::noted(int result, const QvVideoFilter& filter) {
     return result;
 }
 
-// The members behind the head work on the frame that the head has ready.
+// The members after the head work on the frame that the head has ready.
 int QvVf::applyMembers(const Group& group) {
     int result = QvStatus::ok;
     if (group.size() == 1 || group.front()->ready() <= 0) return result;
@@ -150,7 +150,7 @@ std::size_t QvVf::lastReadyGroup() const {
     return noGroup;
 }
 
-// Moves the ready frame of a group into the group behind it.
+// Moves the ready frame of a group into the next group.
 void QvVf::handOver(std::size_t group) {
     auto* head = groups_[group].front();
     const int before = ready();

@@ -4,8 +4,8 @@
 // A filter that fails to write, apply or close does not stop the others. The first such failure since open is
 // the pipe's errorCode and errorDesc, with the filter's name, until it is opened again.
 //
-// A group is a head, which is written to and produces frames, and the filters behind it that work in place on
-// each frame that leaves the head.
+// A group is a head, which is written to and produces frames, and the filters after it, which work in place
+// on each frame that leaves the head.
 #pragma once
 
 #include <deque>

@@ -1,7 +1,7 @@
 // The platform contract: all that the engine asks of the operating system, in one substitutable class.
 //
 // QvPlatform's own bodies are the real system's (core/arch/posix). A test derives from it, overrides the
-// operation that shall fail (a disk that fills up, a thread that does not start) and installs the object
+// operation that is to fail (a disk that fills up, a thread that does not start) and installs the object
 // with qv_set_platform; see tests/support/platform_scope.h.
 //
 // Names are byte strings: what the file system holds, UTF-8 by custom but not by force. Wide names become
@@ -36,7 +36,7 @@ struct QvFolderEntry {
     bool isFolder = false;  // also true of a symbolic link to a folder
 };
 
-// In whose hands the file of a library may be.
+// Who may own the file of a library, and who may write it.
 enum class QvLibraryTrust {
     // Root and this user (the effective one) own the file, each folder on the way to it and each link, and
     // nobody else may write to them: not everybody, nor a group, except the user's private one and root's.

@@ -32,7 +32,7 @@ Any extensionOf(const Any& filename) {
     return Any("");
 }
 
-// The caller's callback, if there is one, and what it is told.
+// The caller's callback, if there is one, and what it gets.
 class Reporter {
   public:
     Reporter(const Any& filename, QvFileOpenCb* callback) : callback_(callback) { data_.filename = filename; }
@@ -109,7 +109,7 @@ void setUp(QvDecodePipe& decoder, const Any& filename, const Any& fourcc, const 
     if (!fourcc.isValid()) return;
     try {
         decoder.setParam("FOURCC", fourcc);
-    } catch (const QvParamException&) {  // only few decoders can be told
+    } catch (const QvParamException&) {  // few decoders have this parameter
     }
 }
 

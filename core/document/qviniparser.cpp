@@ -70,7 +70,6 @@ class Reading {
   private:
     void take(std::string_view line) {
         if (line.empty() || line.front() == '#' || line.front() == '!') return;
-        // Short lines are let off with a message, but for those that can be told for what they are.
         if (line.size() < shortestLine && line.front() != '[' && separatorOf(line) == line.npos) {
             report("line too short");
             return;

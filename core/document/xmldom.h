@@ -60,7 +60,7 @@ class QV_API XmlNode {
     void deleteChildren();                                           // takes no memory
 
     // Writes the element to a std::FILE*, two blanks an indent. -1 if the node has no name or the stream
-    // refuses a part, else 0; children without a name are left out. What can't stand in a document (control
+    // refuses a part, else 0; children without a name are left out. What a document can't hold (control
     // characters, bytes that are not UTF-8) is written as U+FFFD. Whether the stream took it all is to be
     // asked of the stream.
     int write(void* stream, int indent) const;

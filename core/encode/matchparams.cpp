@@ -1,4 +1,4 @@
-// QvUtil::matchParams: settings of a source that its output shall have, too.
+// QvUtil::matchParams: settings of a source that its output takes over.
 #include <cmath>
 #include <limits>
 #include <string>

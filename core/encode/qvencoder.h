@@ -5,7 +5,7 @@
 //     writeFrame | writePcm ...     close | abort                  detachOutStream
 //
 // States are those of QvCodec: 1 created, 2 initialised, 3 open. An encoder belongs to the thread that
-// drives it; one that runs a worker of its own behind writeFrame owns that synchronisation.
+// drives it; one that gives what writeFrame gets to a worker of its own does the locking.
 #pragma once
 
 #include "core/encode/codecstate.h"

@@ -49,7 +49,7 @@ const QvAudioStreamReport* levelReport(QvDecodePipe& decoder, int stream, const 
     return measurable ? decoder.getAudioStreamReport(stream, watch) : nullptr;
 }
 
-// Several readings in a row as one, for who watches them.
+// Several readings in a row, shown to a watcher as one.
 class ReadingSteps {
   public:
     ReadingSteps(const QvReadWatch& watch, std::ptrdiff_t count)

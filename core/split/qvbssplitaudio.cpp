@@ -158,7 +158,7 @@ Any QvBsSplitAudio::_channelFileName(const Any& name, int channel) {
     return QvFile::joinPath(QvFile::getPath(name), file);
 }
 
-// Of a stream, where no one can go back to it: with the size that is expected.
+// A pipe can't be patched at the end, so its header has the size that is expected.
 std::array<unsigned char, wavHeaderBytes> QvBsSplitAudio::streamHeader() {
     const WavFormat format = wav_->fileFormat();
     const Any& expected = params().get("expectedSamples");

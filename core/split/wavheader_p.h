@@ -37,7 +37,7 @@ constexpr uint64_t wavLengthUnknown = UINT64_MAX;
 std::array<unsigned char, wavHeaderBytes> wavHeader(const WavFormat& format, const WavExtent& extent);
 
 // Writes the header over the first 80 bytes of the finished file, of which `trailing` bytes follow the
-// samples. A file whose sizes do not fit is told to the user as a warning. False on failure, with a note in
+// samples. Sizes that do not fit give the user a warning. False on failure, with a note in
 // `failure`.
 bool writeWavHeader(const QvWideString& name, const WavFormat& format, QvIoFailure& failure,
                     uint64_t trailing = 0, bool mayBeRf64 = false);

@@ -113,7 +113,7 @@ struct BufSeekInfo {
 #pragma pack(pop)
 static_assert(sizeof(BufSeekInfo) == 20);
 
-// Info of BUF_SEEK_REORDER. The file holds head, body, block; it shall hold head, block, body.
+// Info of BUF_SEEK_REORDER. The file holds head, body, block; what is wanted is head, block, body.
 struct BufExtent {
     uint64_t position;  // in the file as it was written
     uint64_t size;

@@ -33,7 +33,7 @@ struct bufstream {
     void* reserved[2];                               /* zero */
     unsigned flags;                                  /* BUFSTREAM_WRITER or 0 */
     unsigned (*state)(struct bufstream* self);       /* null in FIFOs and files */
-    void* context;                                   /* the object behind the record */
+    void* context;                                   /* the object that owns the record */
 };
 
 #define BUFSTREAM_WRITER 1u          /* also set on both records of a FIFO */

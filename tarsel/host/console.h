@@ -1,5 +1,5 @@
 // The standard streams. What is printed is data for the standard output; it is gathered and goes out in
-// blocks, so that a stream that takes nothing is noticed where it can be told.
+// blocks, so that a stream that takes nothing is noticed while it can still be reported.
 #pragma once
 
 #include <string>

@@ -12,7 +12,7 @@ namespace {
 
 std::string quoted(const std::string& name) { return QvFile::shellQuote(Any(name.c_str())).asString(); }
 
-// The name that the digits at `at` count from 1, all names when they count none of them. Moves `at` behind
+// The name that the digits at `at` count from 1, all names when they count none of them. Moves `at` past
 // them.
 std::string counted(const std::vector<std::string>& names, const std::string& command, size_t& at) {
     size_t number = 0;

@@ -85,5 +85,5 @@ FilterFiles filterFiles(const QvVProcessPipe& pipe);
 // The pipe of a job, null if it has nothing to do. Each filter has been tried, so that what fails later fails
 // by chance. Throws Failure.
 std::unique_ptr<QvVProcessPipe> tryPipe(const VideoJobDescription& job);
-// A line for each filter of a pipe: its name and what it was told.
+// A line for each filter of a pipe: its name and its parameters.
 std::vector<std::string> describe(const QvVProcessPipe* pipe);

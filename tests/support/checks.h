@@ -23,7 +23,7 @@
 
 using Texts = std::vector<std::string>;
 
-// The text of the engine's exception that an action ends with, of an assertion only the message behind the
+// The text of the engine's exception that an action ends with, of an assertion only the message after the
 // place; "no failure" if there is none.
 template <class Action>
 std::string failureOf(Action action) {

@@ -1,4 +1,4 @@
-// Memory behind which a page without access lies, so that one byte too many is a crash, and that shows what
+// Memory that ends at a page without access, so that one byte too many is a crash, and that shows what
 // was written beside its bytes.
 #pragma once
 

@@ -18,7 +18,7 @@ inline QvFrame makePicture(unsigned fourcc, int width, int height, unsigned seed
     return frame;
 }
 
-// The planes one behind the other.
+// The planes one after the other.
 inline std::string pictureBytes(const QvFrame& frame) {
     return {reinterpret_cast<const char*>(frame.plane(0)), static_cast<size_t>(frame.total_bytes())};
 }

@@ -22,7 +22,7 @@ class ChConvert : public StoredFilterOf<ChConvertSettings> {
   public:
     ChConvert();
 
-    // -1 for a matrix that is none.
+    // -1 for a matrix that makes no sense.
     int open() override;
     // -1 for a sound without a channel that the matrix names.
     int write(QvPcm& pcm) override;

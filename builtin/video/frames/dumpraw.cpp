@@ -33,7 +33,7 @@ int DumpRaw::open() {
     if (name != DumpRawSettings().filename)
         file_.reset(qv_platform().openOutput(name.c_str(), cancel_, isStream));
     if (file_) {
-        // A frame is written as a whole: what fails is told with the frame and not later.
+        // A frame is written as a whole: what fails is reported with the frame and not later.
         std::setvbuf(file_.get(), nullptr, _IONBF, 0);
         return InPlaceEffectOf::open();
     }

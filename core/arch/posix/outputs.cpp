@@ -25,7 +25,7 @@ constexpr std::size_t safePiece = 512;
 enum class Waiting {
     never,       // the file that the shell opened as the standard output
     atRefusal,   // the descriptor is our own and does not block
-    perSend,     // a socket: each call says that it shall not block
+    perSend,     // a socket: each call asks not to wait
     beforehand,  // shared with other processes, for which it has to stay as it is
 };
 
@@ -124,7 +124,7 @@ bool StreamOutput::openOwn(int number) {
     return descriptor_ >= 0;
 }
 
-// Only a blocking open() would be told of a reader that comes, and nothing could end that.
+// A blocking open() would return when a reader comes, but nothing could end that wait: so this polls.
 bool StreamOutput::openNamed(const char* name) {
     for (;;) {
         descriptor_ = ::open(name, O_WRONLY | O_NONBLOCK | O_NOCTTY | O_CLOEXEC);

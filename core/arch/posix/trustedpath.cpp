@@ -25,7 +25,8 @@ const Entry* lookUp(int (*ask)(Id, Entry*, char*, std::size_t, Entry**), Id id, 
 
 // True if members of the group are this user and root alone: root's group, and the group of the user's own
 // that most systems make with the user. It has the user's name; a system without names gives it the user's
-// number. That a group lists no other member says nothing: users whose primary group it is are not listed.
+// number. A group without members in its list can still have some: users whose primary group it is are not
+// listed.
 bool isPrivate(gid_t group) {
     std::vector<char> groupText, userText;
     struct group groupEntry {};

@@ -35,7 +35,7 @@ class QV_API QvSubtitleRender {
     QvSubtitleRender& operator=(const QvSubtitleRender&) = delete;
     ~QvSubtitleRender();
 
-    // Loads the fonts. A font that can't be loaded is told in the debug log and draws nothing. 0, or -1 if
+    // Loads the fonts. A font that can't be loaded is logged and draws nothing. 0, or -1 if
     // FreeType can't be used. May be called again with other options.
     int init(const QvTextRenderingOptions& options);
 
@@ -45,7 +45,7 @@ class QV_API QvSubtitleRender {
 
     // Draws in place, onto any format that QvFrame::blend knows. `color`: of the letters, white if null or
     // if it is YUV. The position counts if it lies within the picture; several lines go down from there.
-    // 0; what can't be drawn is told in the debug log.
+    // 0; what can't be drawn is logged.
     int render(QvFrame& frame, const QvSubtitle& subtitle, const QvColor* color);
 
   private:

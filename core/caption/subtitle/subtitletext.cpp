@@ -25,8 +25,8 @@ struct CloseFile {
 bool endsLinesWithCr(std::string_view text) {
     const std::size_t first = text.find_first_of("\r\n");
     if (first == text.npos) return false;
-    const std::size_t behind = text.find_first_not_of('\r', first);
-    return text[first] == '\r' && (behind == text.npos || text[behind] != '\n');
+    const std::size_t next = text.find_first_not_of('\r', first);
+    return text[first] == '\r' && (next == text.npos || text[next] != '\n');
 }
 
 std::string swappedUnits(std::string_view bytes, std::size_t unit) {

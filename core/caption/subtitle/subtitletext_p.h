@@ -11,7 +11,7 @@ class Any;
 // A file's bytes, followed by four zeros.
 class SubtitleBytes {
   public:
-    // 0, or -1 (no memory is told in the debug log).
+    // 0, or -1; want of memory is logged.
     int read(const Any& filename);
     std::string_view view() const { return {memory_.get(), size_}; }
 

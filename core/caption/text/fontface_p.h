@@ -57,7 +57,7 @@ class FontFace {
   public:
     static constexpr int largestSize = 4096;  // pixels; a letter of it covers the largest pictures
 
-    // What fails is told in the debug log and leaves the face without glyphs. The library has to outlive it.
+    // A failure is logged and leaves the face without glyphs. The library has to outlive it.
     // `pixels`: the height of a letter; its width is divided by `pixelAspect`. `number`: of the face in a
     // file that holds several.
     void load(FontLibrary& library, const Any& file, int pixels, double pixelAspect = 1, int number = 0);

@@ -2,7 +2,7 @@
 //
 // A name is a String (bytes) or a WString (16-bit units); results have the width of the argument unless said
 // otherwise. Text operations take both "/" and "\\" as separators on every platform. How wide names and bytes
-// correspond is told in core/arch/widename.h.
+// correspond is described in core/arch/widename.h.
 //
 // Operations that fail return -1, null or an invalid Any and don't throw; an argument that is no text is
 // misuse and asserts where the operation says so, else it counts as a failure.

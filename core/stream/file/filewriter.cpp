@@ -72,7 +72,7 @@ unsigned char* FileWriter::request(unsigned n) {
     return buffer_.data() + fill_;
 }
 
-// A full buffer goes out at once: writers that ask for what usable() says must not be told 0 for ever.
+// A full buffer goes out at once: writers that ask for what usable() says must not get 0 for ever.
 unsigned FileWriter::confirm(unsigned n) {
     n = std::min(n, usable());
     fill_ += n;

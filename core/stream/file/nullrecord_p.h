@@ -3,5 +3,5 @@
 
 #include "core/stream/bufstream.h"
 
-// Null without memory; `onError`, which may be null, is told why.
+// Null without memory; `onError`, which may be null, gets the reason.
 bufstream* nullRecordNew(unsigned size, void (*onError)(const char* text));

@@ -79,8 +79,8 @@ class Vobus {
     bool video(int i) const { return data_.flags[static_cast<size_t>(i)] & 1; }
     // 0 after the last, as in an array that was cleared.
     uint32_t sector(int i) const { return i < count() ? data_.sector[static_cast<size_t>(i)] : 0; }
-    bool videoIn(int first, int behind) const {
-        return first < behind && video_[static_cast<size_t>(first)] < video_[static_cast<size_t>(behind)];
+    bool videoIn(int first, int end) const {
+        return first < end && video_[static_cast<size_t>(first)] < video_[static_cast<size_t>(end)];
     }
 
     // The first VOBU up to `last` with which the time from the start of `i` on reaches `time`.

@@ -40,7 +40,7 @@ bool isLegalWidth(int bits, int bytes) {
 
 }  // namespace
 
-// What is set before a run, and who takes part in one.
+// What is set before a run, and the objects that take part in one.
 struct QvPushEncoder::PushEncoder_p {
     PushEncoder_p() { input.init(); }
 

@@ -14,13 +14,13 @@
 //     result = push.close(false);
 //     result |= pipe->close();
 //
-// An end mark takes effect at once: frames that are still queued behind it are dropped, samples are not. So
+// An end mark takes effect at once: frames that are queued after it are dropped, samples are not. So
 // wait with process() until the worker needs video, and then write the mark. Sound beyond the time of the
 // pictures is dropped; where it ends before them, silence follows.
 //
 // Writes may come from any threads, for each stream in the order of its pictures; they copy and never wait:
-// when the worker falls behind, memory grows (a warning in the log tells). The other operations belong to one
-// thread. The first video and the first audio stream go through the links.
+// when the worker is slower than the caller, memory grows (a warning in the log tells). The other operations
+// belong to one thread. The first video and the first audio stream go through the links.
 #pragma once
 
 #include <memory>
@@ -48,9 +48,9 @@ class QV_API QvPushEncoder {
     int addVideoStream(AnyDict& params, ProcessParams* process);
     // "bufferLength" (optional) samples fit at first, 48000 by default; "bytesPerSample" or "bitsPerSample"
     // may be left out. Rates up to 96000, 8, 16, 20, 24 or 32 bits. Of `process` the filters and the channel
-    // map are used. QvStatus::failed for a format that is none; nothing is added then.
+    // map are used. QvStatus::failed for an impossible format; nothing is added then.
     int addAudioStream(AnyDict& params, ProcessParams* process);
-    // Readies the links and then opens the pipe, so that links that can't work leave no empty file behind.
+    // Readies the links and then opens the pipe, so that links that can't work leave no empty file.
     // The statuses of the links are ORed. On failure the state stays closed.
     int open();
     int start();  // the worker; asserts "Invalid state" unless open
@@ -62,7 +62,7 @@ class QV_API QvPushEncoder {
     // The same for the filled samples of a block; 0 for the end mark.
     int writeSamples(QvPcm* samples, int stream);
 
-    // The worker stands still for lack of a frame, or of samples, of that stream.
+    // The worker waits for a frame, or of samples, of that stream.
     bool needsVideo(int stream) const;
     bool needsAudio(int stream) const;
     // Waits until the worker needs input or has ended. 0

@@ -39,7 +39,7 @@ class QV_API QvTranscoder {
 
     // With a null task the transcoder makes and owns one.
     explicit QvTranscoder(QvTask* task = nullptr);
-    // Copies share nothing but the task pointer: they serve the class interface alone.
+    // Copies share nothing but the task pointer: only the class interface needs them.
     QvTranscoder(const QvTranscoder& other);
     QvTranscoder& operator=(const QvTranscoder& other);
 

@@ -21,7 +21,7 @@ struct TranscoderSettings {
     bool writeLogfile = false;
     bool smartRender = false;
 
-    // A status; nothing for a name that is none of these.
+    // A status; empty for any other name.
     std::optional<int> setParam(const char* name, const Any& value);
     void getParam(const char* name, Any& value) const;
 };

@@ -96,7 +96,7 @@ std::string shapeOf(std::string_view name) {
     return shape;
 }
 
-// The number in "card#0007.png" behind "card#"; -1 for another name, or a number beyond any use.
+// The number in "card#0007.png" after "card#"; -1 for another name, or a number beyond any use.
 long long numberIn(const std::string& name, const std::string& start, const std::string& extension) {
     const size_t end = name.size() - std::min(name.size(), extension.size());
     if (name.rfind(start, 0) != 0 || end <= start.size() || name.substr(end) != extension) return -1;

@@ -58,7 +58,7 @@ class Outputs {
 
     // What the multiplexer would be given, for asking it for its names; the folder is not there yet.
     std::string hiddenName(const std::string& extension) const;
-    // Makes the hidden folder; the name in it that the multiplexer shall write to, with this extension, or
+    // Makes the hidden folder; the name in it that the multiplexer is to write to, with this extension, or
     // with none.
     std::string begin(const std::string& extension);
     // What was written so far, sorted.

@@ -21,7 +21,7 @@ class Transaction {
         std::string folder;  // around the work folder, as the user named it
         WorkFolder work;
         size_t members = 0;  // outputs that write here
-        Manifest set;        // what shall change its name
+        Manifest set;        // the files to rename
 
       private:
         friend class Transaction;

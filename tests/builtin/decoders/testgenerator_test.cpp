@@ -37,7 +37,7 @@ TEST_F(Testgen, FramesCountUpFromWhereTheSeekWent) {
     Texts pictures;
     for (int i = 0; i < 7; ++i) {
         ASSERT_EQ(decoder.readFrame(0), 0);
-        EXPECT_EQ(decoder.getFramePtr(0)->frameNr, i) << "also behind the end";
+        EXPECT_EQ(decoder.getFramePtr(0)->frameNr, i) << "also after the end";
         pictures.push_back(pixels());
     }
     EXPECT_FALSE(pictures[0] == pictures[1]) << "the cursor moves";

@@ -76,7 +76,7 @@ TEST_F(Wav, FindsItsChunksAmongOthers) {
         {"an odd one without its padding", riff(unpadded + format + dataChunk)},
         {"the word in a text", riff(format + wavChunk("LIST", "ISFTdata\x02\0\0\0") + dataChunk)},
         {"extensible", riff(extended + dataChunk)},
-        {"chunks behind the data", riff(format + dataChunk + wavChunk("LIST", "INFOabcd"))},
+        {"chunks after the data", riff(format + dataChunk + wavChunk("LIST", "INFOabcd"))},
         {"a far chunk", riff(format + wavChunk("bext", std::string(90000, 'd')) + dataChunk)},
     };
     for (const auto& c : cases) {

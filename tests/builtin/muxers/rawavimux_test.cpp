@@ -244,7 +244,7 @@ TEST_F(RawAvi, SegmentsAndInterleaving) {
     EXPECT_EQ(first, avi.firstFrames);
     EXPECT_EQ(first, avi.streams[0].units[0]);
 
-    // Each picture comes before the sound that follows it in time, and behind all sound before it.
+    // Each picture comes before the sound that follows it in time, and after all sound before it.
     double shown = 0, heard = 0;
     for (const auto& chunk : avi.inOrder) {
         if (chunk.id == "02wb") heard += static_cast<double>(chunk.bytes) / 4 / 48000;

@@ -1,4 +1,4 @@
-// Outputs that are no files: who waits for whom, and what ends the wait.
+// Outputs that are no files: which end waits for the other, and what ends the wait.
 #include <fcntl.h>
 #include <poll.h>
 #include <pty.h>

@@ -147,7 +147,7 @@ TEST_F(Factory, ParametersAreTakenOrTheFileStaysClosed) {
          "rawdec has no parameter 'openParameters'"},
         {"a value of a wrong type", file, with("width", Any("64")), nullptr,
          "rawdec: Invalid value of parameter 'width'"},
-        {"a size that is none", file, with("width", Any(0)), nullptr, "Invalid frame size 0x"},
+        {"a size of zero", file, with("width", Any(0)), nullptr, "Invalid frame size 0x"},
         {"an unknown format", file, with("FOURCC", Any("NOPE")), nullptr, "rawdec: "},
         {"another decoder", file, format, "wavdec", "wavdec has no parameter 'FOURCC'"},
         {"no decoder", file, format, "nobody", "'nobody'"},

@@ -41,7 +41,7 @@ TEST(AudioStreamReport, RangesAreOfSamplesAndClamped) {
     report.init(4000, 2, 48000, 16);
     for (const char* level : {"\x64\0", "\0\x40", "\x0A\0"})
         EXPECT_EQ(report.processGroup(pcmOf(2, repeated({level, 2}, 3200))), 0);
-    EXPECT_EQ(report.processGroup(pcmOf(2, std::string(4, 0))), -1) << "behind the last group";
+    EXPECT_EQ(report.processGroup(pcmOf(2, std::string(4, 0))), -1) << "after the last group";
     EXPECT_NEAR(report.peakdB(0, 1599), 20 * std::log10(100 / 32768.0), 1e-9);
     EXPECT_NEAR(report.peakdB(0, 1600), -6.0206, 1e-4);
     EXPECT_NEAR(report.peakdB(-100000, 1LL << 60), -6.0206, 1e-4);

@@ -70,7 +70,7 @@ TEST_F(VideoChain, OnlyWhatDiffersNeedsAFilter) {
         {{720, 576, p25, 720, 1080, p25, 0, 2}, "scaler:i1:o2"},
         {{720, 719, p25, 720, 720, p25}, "scaler:i1:o2"},
         {{720, 720, p25, 720, 719, p25}, "scaler:i2:o1"},
-        // A field serves where half the lines are thrown away; its 540 lines don't count as BT.709.
+        // A field is enough where half the lines are thrown away; its 540 lines don't count as BT.709.
         {{1920, 1080, i59, 720, 480, p29}, "deinterlace:top scaler"},
         {{1920, 1080, i59, 1280, 720, p29}, "scaler"},
         {{1920, 1080, i59, 720, 480, i59}, "scaler:i2:o1"},

@@ -27,7 +27,7 @@ void forPixels(QvFrame& frame, Each each) {
                 each(p, y, frame.plane(p) + y * frame.stride(p) + x * bytes, y * width + x);
 }
 
-// Every byte of a pixel holds `first`, or the letter so many behind it as its place tells.
+// Every byte of a pixel holds `first`, or the letter as many further on as its place says.
 QvFrame lettered(unsigned fourcc, int width, int height, int padding, char first, bool counted) {
     QvFrame frame = noiseFrame(fourcc, width, height, padding, 1);
     const int bytes = qvPixelFormat(fourcc)->pixelBytes;

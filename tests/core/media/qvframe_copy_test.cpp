@@ -8,7 +8,7 @@ namespace {
 
 using namespace QvFourcc;
 
-// Every plane's rows, padding included, hold `first` and the letters behind it.
+// Every plane's rows, padding included, hold `first` and the letters after it.
 void letter(QvFrame& frame, char first) {
     for (int p = 0; p < frame.planes(); ++p)
         for (int i = 0; i < frame.plane_bytes(p); ++i)

@@ -161,7 +161,7 @@ TEST_F(QvBsSplitAudioTest, EachChannelIsAMonoFile) {
         EXPECT_EQ(stream.ioError(), 0);
         EXPECT_EQ(copyIn(stream.input(), "abc"), 3u);
         tell(stream.input(), AUDIO_AU_CODE, 3u);
-        EXPECT_FALSE(stream.input()->request(stream.input(), 1)) << "nothing goes in behind the end";
+        EXPECT_FALSE(stream.input()->request(stream.input(), 1)) << "nothing goes in after the end";
     }
 }
 

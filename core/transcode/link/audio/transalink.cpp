@@ -168,7 +168,7 @@ int TransALink::takeRange(const LinkOpen& given) {
     qv_dbg()->debug("%s", points ? "ALink.open: In/out points are set."
                                  : "ALink.open: In/out points constructed from duration.");
     if (points && outPoint() <= inPoint())
-        return setError(QvStatus::failed, "The out point does not lie behind the in point");
+        return setError(QvStatus::failed, "The out point is not after the in point");
     return QvStatus::ok;
 }
 

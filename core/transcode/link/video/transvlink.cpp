@@ -127,8 +127,7 @@ int TransVLink::takeRange(const LinkOpen& given, const VideoFormat& in) {
     QvFrameRange range(inPoint(), outPoint(), in.framerate);
     qv_dbg()->debug("VLink.open: in=%f, out=%f (sec)", inPoint().seconds(), outPoint().seconds());
     qv_dbg()->debug("VLink.open: Start frame=%d, end frame=%d", range.start, range.stop);
-    if (points && range.empty())
-        return setError(QvStatus::failed, "The out point does not lie behind the in point");
+    if (points && range.empty()) return setError(QvStatus::failed, "The out point is not after the in point");
     range.convert(in.framerate, outFramerate_);
     *range_ = range;
     return QvStatus::ok;
@@ -387,7 +386,7 @@ bool TransVLink::losesAll() const {
     return error == QvStatus::outOfMemory || static_cast<int>(videoPipe_->framesIn()) >= range_->in;
 }
 
-// Where a halving takes one frame more than the stream has, the last one serves twice; otherwise null.
+// Where a halving takes one frame more than the stream has, the last one is taken twice; otherwise null.
 QvFrame* TransVLink::completePair() {
     if (!range_->pairCompleted || static_cast<int>(videoPipe_->framesIn()) + 1 != range_->in) return nullptr;
     QvFrame* last = decoder_->getFramePtr(decStreamNr_);

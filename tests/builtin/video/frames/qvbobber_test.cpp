@@ -109,7 +109,7 @@ TEST(QvBobber, EveryFormatAndShape) {
             ASSERT_EQ(bob.write(in), 0);
             ASSERT_EQ(bob.write(in), 0);
             EXPECT_EQ(bob.ready(), 2);
-            // Noise that stands still comes out whole, but for bits that no sample has.
+            // Noise that does not change comes out whole, but for bits that no sample has.
             const bool isWhole = format.pixelBytes > 0 && format.fourcc != QvFourcc::R555;
             for (; bob.ready() > 0 && height % 2 == 0; bob.next())
                 EXPECT_EQ(pictureBytes(*bob.frame()) == pictureBytes(in), isWhole) << in.str_four_cc();

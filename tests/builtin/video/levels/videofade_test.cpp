@@ -58,7 +58,7 @@ TEST(CVideoFade, EveryFormatFadesToItsBlackAndKeepsAlpha) {
         const bool alpha =
             name == "BGRA" || name == "BGR4" || name == "ARGB" || name == "R32C" || name == "b64a";
         EXPECT_EQ(first == second, !alpha) << name;
-        EXPECT_TRUE(samplesOf(fade.through(in)) == samplesOf(in)) << name << ": untouched behind the fade";
+        EXPECT_TRUE(samplesOf(fade.through(in)) == samplesOf(in)) << name << ": untouched after the fade";
     }
     QvFrame clear = makePicture(QvFourcc::BGRA, 4, 2);
     EXPECT_EQ(Opened({{"fade_in", 1}}).through(clear).plane()[7], clear.plane()[7]);

@@ -156,7 +156,7 @@ TEST(QvCcProcessor, DealsOutWhatIsDueAndFillsUp) {
     EXPECT_EQ(hex(queue), "fe2012 fe2013 fc0102");
 }
 
-// Every code of a set, the extended ones behind the character that they replace.
+// Every code of a set, the extended ones after the character that they replace.
 std::vector<int> wordsOf(int set, int first, int last) {
     std::vector<int> words;
     for (int code = first; code <= last; code += set == 0 ? 2 : 1) {

@@ -116,7 +116,7 @@ TEST_F(Ring, CopyingInTakesTheLastByteAndRequestsDoNot) {
     EXPECT_EQ(usable(out), 0u) << "a ring filled to the last byte reads as empty";
 }
 
-// Kernels that commit more than they were given, or twice, must not reach behind the ring.
+// Kernels that commit more than they were given, or twice, must not reach past the ring.
 TEST_F(Ring, CommitsAreBoundedByTheBlock) {
     EXPECT_FALSE(in->request(in, 17));
     EXPECT_EQ(in->confirm(in, 5), 0u) << "without a block";

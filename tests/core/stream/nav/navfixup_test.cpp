@@ -150,8 +150,8 @@ TEST(NavigationTables, GapsWithoutVideoAreSeenAtAFixedPoint) {
     EXPECT_EQ(first.forward(1), 0x80000001);
     EXPECT_EQ(first.forward(2), 2u);
     EXPECT_EQ(first.forward(15), 19u | 0x40000000) << "10 s, with video on the way";
-    EXPECT_EQ(first.forward(16), 0x7FFFFFFF) << "no 30 s, but video behind the 10 s";
-    EXPECT_EQ(first.forward(17), 0x3FFFFFFF) << "nothing behind an entry that found nothing";
+    EXPECT_EQ(first.forward(16), 0x7FFFFFFF) << "no 30 s, but video after the 10 s";
+    EXPECT_EQ(first.forward(17), 0x3FFFFFFF) << "nothing after an entry that found nothing";
     EXPECT_EQ(first.u32(nextVideo), 0x80000001);
     const Pack gap(files[0], 10);
     EXPECT_EQ(gap.u32(nextVideo), 0xBFFFFFFF) << "only the successor is asked";

@@ -114,7 +114,7 @@ TEST(TransVLink, FailuresComeOut) {
         const char* text;
     } rows[] = {
         {[](Job& j) { j.params.set("inOutPoints", pointsOf(MediaTime(0.2), MediaTime(0.1))); }, -1, 0,
-         "The out point does not lie behind the in point"},
+         "The out point is not after the in point"},
         {[](Job& j) { j.decoder.video.set("framerate", Any(QvFramerate(QvRatio(25, 0)))); }, -1, 0, ""},
         {[](Job& j) {
              qv_registry()->cleanup();
@@ -176,7 +176,7 @@ TEST(TransVLink, RepeatsTheLastFrameForAnEvenCount) {
         }
 }
 
-// The source has more frames than are taken, or one too few: then its last frame serves twice.
+// The source has more frames than are taken, or one too few: then its last frame is taken twice.
 TEST(TransVLink, HalvedRateTakesAnEvenNumberOfFramesAndMovesTheChapters) {
     for (const int frames : {20, 11}) {
         Job job(frames, f50, f25);
@@ -210,7 +210,7 @@ TEST(TransVLink, FiltersHearHowManyFramesTheyWillSee) {
     EXPECT_EQ(total("scaler", 0), 50);
     EXPECT_EQ(total("frconvert", 0), -1);
     EXPECT_EQ(total("videofade", 1), 100);
-    // A bobber makes two frames of one, before them or behind.
+    // A bobber makes two frames of one, before them or after.
     job.link.close();
     job.params.set("effects", customFilters(AnyVector(at("bobber", 1, 1), early, late, at("bobber", 0, 2))));
     ASSERT_EQ(job.open(), 0);
