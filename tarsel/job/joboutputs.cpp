@@ -111,8 +111,8 @@ long long JobOutputs::freeSpace() const {
 }
 
 FiltersState JobOutputs::begun(FiltersState filters) {
-    renameFilterFiles(filters, [&](const std::string& file, const char*) {
-        const auto dump = dumps_.find(file);
+    changeFilterFiles(filters, [&](const std::string& file, const char*, bool writes) {
+        const auto dump = writes ? dumps_.find(file) : dumps_.end();
         return dump == dumps_.end() ? file : dump->second->begin("");
     });
     return filters;

@@ -419,21 +419,48 @@ std::string filterFile(const QvCodec& filter, int guiControl) {
     return value.asString("");
 }
 
-void renameFilterFiles(FiltersState& filters,
-                       const std::function<std::string(const std::string& file, const char* filter)>& other) {
+namespace {
+
+// The parameters of a filter that name a file which it reads.
+std::vector<std::string> filesRead(const QvCodec& filter) {
+    auto params = fileParams(filter, QV_GUI_FILESELECT_LOAD);
+    params.emplace_back("font_filename");  // which not every filter describes
+    return params;
+}
+
+std::string textOf(const QvCodec& filter, const std::string& param) {
+    const Any value = filter.getParam(param.c_str());
+    return value.isText() ? value.toString().asString("") : "";
+}
+
+// What a new filter has stands for no file of the user's. True if another name was set.
+bool changeFile(QvCodec& filter, const std::string& param, const QvCodec& fresh, bool writes,
+                const OtherFile& other) {
+    const std::string file = textOf(filter, param);
+    if (file.empty() || file == textOf(fresh, param)) return false;
+    const std::string name = other(file, filter.name(), writes);
+    return name != file && filter.setParam(param.c_str(), name.c_str()) == QvStatus::ok;
+}
+
+bool changeFiles(QvCodec& filter, const OtherFile& other) {
+    const std::unique_ptr<QvCodec> fresh(qv_registry()->newCodec(filter.name()));
+    bool changed = false;
+    for (const auto& param : filesRead(filter)) changed |= changeFile(filter, param, *fresh, false, other);
+    for (const auto& param : fileParams(filter, QV_GUI_FILESELECT_SAVE))
+        changed |= changeFile(filter, param, *fresh, true, other);
+    return changed;
+}
+
+}  // namespace
+
+void changeFilterFiles(FiltersState& filters, const OtherFile& other) {
     const AnyVector names = filters.names();
     for (int i = 0; i < filters.count(); ++i) {
-        AnyDict dict = filters.filterAt(i);
         const std::unique_ptr<QvCodec> filter(qv_registry()->newCodec(names.at(i).asString("")));
-        const auto params = filter ? fileParams(*filter, QV_GUI_FILESELECT_SAVE) : std::vector<std::string>();
-        if (params.empty()) continue;
-        const std::string& param = params.front();
-        const Any initial = filter->getParam(param.c_str());
+        if (!filter) continue;
+        AnyDict dict = filters.filterAt(i);
         filter->restore(dict);
-        const Any file = filter->getParam(param.c_str()).toString();
-        // Without a name it fails in its own words.
-        if (file == initial || !*file.asString("")) continue;
-        filter->setParam(param.c_str(), other(file.asString(""), filter->name()).c_str());
+        if (!changeFiles(*filter, other)) continue;
         filter->store(dict);
         filters.setFilterAt(i, dict);
     }
@@ -443,9 +470,7 @@ FilterFiles filterFiles(const QvVProcessPipe& pipe) {
     FilterFiles files;
     for (int i = 0; i < pipe.nrFilters(); ++i) {
         const QvCodec& filter = *pipe.filter(i);
-        auto params = fileParams(filter, QV_GUI_FILESELECT_LOAD);
-        params.emplace_back("font_filename");  // which not every filter describes
-        for (const auto& param : params)
+        for (const auto& param : filesRead(filter))
             if (const Any value = filter.getParam(param.c_str()); value.isText())
                 files.read.emplace_back(value.toString().asString(""));
         if (const auto name = filterFile(filter, QV_GUI_FILESELECT_SAVE); !name.empty())

@@ -68,9 +68,9 @@ AnyDict filterState(const std::string& spec);
 // descriptions of parameters say; empty without one.
 std::string filterFile(const QvCodec& filter, int guiControl);
 
-// Gives each filter that writes a file another name for it, `other(file, filter)`.
-void renameFilterFiles(FiltersState& filters,
-                       const std::function<std::string(const std::string& file, const char* filter)>& other);
+// Puts another name in the place of each file that filters read or write.
+using OtherFile = std::function<std::string(const std::string& file, const char* filter, bool writes)>;
+void changeFilterFiles(FiltersState& filters, const OtherFile& other);
 
 // The files that the filters of a pipe have been given.
 struct FilterFiles {

@@ -1,0 +1,122 @@
+#include "tarsel/job/task/storedtask.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <cstring>
+#include <filesystem>
+#include <new>
+
+#include "tarsel/host/files.h"
+#include "tarsel/job/task/taskfiles.h"
+#include "tarsel/words/messages.h"
+
+namespace fs = std::filesystem;
+
+namespace {
+
+constexpr const char* kClass = "TranscodeTask";
+
+// What the factory says of inputs that it can't open.
+struct OpenReport : QvFileOpenCb {
+    std::string file, reason;  // of the first failure
+
+    int fileOpenFinished(int result, QvFileOpenCbData& data) override {
+        if (result == QvStatus::ok || !file.empty()) return 0;
+        file = data.filename.toString().asString("");
+        reason = data.text.toString().asString("");
+        return 0;
+    }
+};
+
+std::string fromFolder(const std::string& name, const fs::path& folder) {
+    const fs::path path(name);
+    return path.is_absolute() ? name : (folder / path).lexically_normal().string();
+}
+
+}  // namespace
+
+void requireTask(const std::string& file) {
+    requireInput(file);
+    const QvTaskFault fault = QvTaskFile::check(Any(file.c_str()));
+    if (fault.status == QvStatus::outOfMemory) throw std::bad_alloc();
+    if (fault.line > 0)
+        throw failure(Msg::taskDamaged, {file, std::to_string(fault.line),
+                                         fault.path.empty() ? "the document" : fault.path, fault.reason});
+    if (fault.status != QvStatus::ok) throw failure(Msg::taskRefused, {file, fault.reason});
+}
+
+std::string writeTask(const AnyDict& state, const std::string& file) {
+    try {
+        errno = 0;
+        if (XmlParser::storeDict(Any(file.c_str()), state, kClass, Any("2.0")) != QvStatus::ok)
+            return "the job can't be stored";
+    } catch (const QvFileException& error) {
+        return errno != 0 ? std::string(": ") + std::strerror(errno) : error.what();
+    }
+    return "";
+}
+
+void makeAbsolute(AnyDict& state) {
+    const fs::path here = fs::current_path();
+    changeTaskFiles(state, [&](const std::string& name, TaskFileUse) { return fromFolder(name, here); });
+}
+
+void makeRelative(AnyDict& state, const std::string& folder) {
+    const fs::path here = fs::current_path(), base = (here / folder).lexically_normal();
+    changeTaskFiles(state, [&](const std::string& name, TaskFileUse) {
+        return fs::path(fromFolder(name, here)).lexically_relative(base).string();
+    });
+}
+
+StoredTask::StoredTask(const std::string& file) : file_(file) {
+    requireTask(file);
+    if (XmlParser::restoreDict(Any(file.c_str()), raw_, kClass) != QvStatus::ok)
+        throw failure(Msg::taskRefused, {file, "it can't be read"});
+    const fs::path folder = fs::absolute(file).parent_path();
+    AnyDict state = raw_;
+    changeTaskFiles(state, [&](const std::string& name, TaskFileUse) { return fromFolder(name, folder); });
+    state_ = QvTaskState(state);
+}
+
+StoredTask::~StoredTask() {
+    task_.reset();
+    decoders_.deleteAll();
+}
+
+std::vector<std::string> StoredTask::inputs() const {
+    std::vector<std::string> names;
+    AnyDict state = state_;
+    changeTaskFiles(state, [&](const std::string& name, TaskFileUse use) {
+        if (use == TaskFileUse::input && std::find(names.begin(), names.end(), name) == names.end())
+            names.push_back(name);
+        return name;
+    });
+    return names;
+}
+
+std::string StoredTask::output() const { return state_.outputFilename().toString().asString(""); }
+
+std::string StoredTask::postProcess() const { return state_.postprocessCommand().toString().asString(""); }
+
+void StoredTask::open() {
+    for (const std::string& name : inputs()) requireInput(name);
+    OpenReport report;
+    QvEncodePipe* pipe = nullptr;
+    Any error;
+    try {
+        task_.reset(QvTask::fromState(state_, decoders_, &pipe, 0, &report, &error));
+    } catch (const QvMemoryFailure&) {
+        throw;
+    } catch (const QvException& broken) {
+        if (report.file.empty()) throw failure(Msg::taskRefused, {file_, broken.what()});
+    }
+    pipe_.reset(pipe);
+    if (!report.file.empty()) throw failure(Msg::inputRefused, {report.file, report.reason});
+    if (!task_) throw failure(Msg::taskRefused, {file_, error.toString().asString("it can't be restored")});
+}
+
+std::vector<std::unique_ptr<Source>> StoredTask::sources() const {
+    std::vector<std::unique_ptr<Source>> sources;
+    for (QvDecodePipe* const decoder : task_->decoders()) sources.push_back(std::make_unique<Source>(*decoder));
+    return sources;
+}

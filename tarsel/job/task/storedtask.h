@@ -1,0 +1,57 @@
+// A task file: read, checked, and made ready to run.
+#pragma once
+
+#include <memory>
+#include <string>
+#include <vector>
+
+#include <qvplugcore/qvplugcore.h>
+
+#include "tarsel/source/source.h"
+
+class StoredTask {
+  public:
+    // Reads and checks the file. Relative names in it count from its folder. Throws Failure.
+    explicit StoredTask(const std::string& file);
+    StoredTask(const StoredTask&) = delete;
+    StoredTask& operator=(const StoredTask&) = delete;
+    ~StoredTask();
+
+    const std::string& file() const { return file_; }
+    // As the file has it, but with absolute names.
+    const QvTaskState& state() const { return state_; }
+    // As it is, without another folder's names in it.
+    const AnyDict& raw() const { return raw_; }
+
+    // The files that sources are read from, without generated ones, and the output; "" for none.
+    std::vector<std::string> inputs() const;
+    std::string output() const;
+    // The command that runs afterwards, with its placeholders; "" for none.
+    std::string postProcess() const;
+
+    // Opens the inputs and makes the output, which opens nothing yet. Throws Failure.
+    void open();
+    // After open. The sources are the decoders of the task's links, each once.
+    QvTask& task() const { return *task_; }
+    std::vector<std::unique_ptr<Source>> sources() const;
+    // Once; the task goes on using it.
+    std::unique_ptr<QvEncodePipe> takePipe() { return std::move(pipe_); }
+
+  private:
+    std::string file_;
+    AnyDict raw_;
+    QvTaskState state_;
+    QvDPipeList decoders_;
+    std::unique_ptr<QvEncodePipe> pipe_;
+    std::unique_ptr<QvTask> task_;
+};
+
+// Throws Failure if a file is no sound task.
+void requireTask(const std::string& file);
+
+// Writes a state as a task file. Returns why it could not, as the end of a sentence; "" when it is written.
+std::string writeTask(const AnyDict& state, const std::string& file);
+
+// Names as a task file is to have them: absolute, or from `folder` on.
+void makeAbsolute(AnyDict& state);
+void makeRelative(AnyDict& state, const std::string& folder);
