@@ -93,6 +93,8 @@ int run(int argc, char** argv) {
     line.option("--plugins", plugins, "Load the plug-ins of FOLDER", "FOLDER", "TARSEL_PLUGINS");
     line.flag("--allow-unsafe-plugins", allowUnsafePlugins, "Load plug-ins that other users may change, too");
     addTranscode(line, signals, version);
+    addRun(line, signals, version);
+    addTask(line, signals);
     addInfo(line);
     addCaptions(line, signals);
     addFrame(line, signals, version);

@@ -4,6 +4,7 @@
 #include "tarsel/commands/commands.h"
 #include "tarsel/host/console.h"
 #include "tarsel/host/files.h"
+#include "tarsel/job/task/storedtask.h"
 #include "tarsel/source/source.h"
 #include "tarsel/words/commandline.h"
 #include "tarsel/words/json.h"
@@ -230,12 +231,7 @@ bool isTaskFile(const std::string& name) {
 
 Json describeTask(const std::string& name) {
     requireInput(name);
-    const QvTaskFault fault = QvTaskFile::check(Any(name.c_str()));
-    if (fault.status == QvStatus::outOfMemory) throw std::bad_alloc();
-    if (fault.line > 0)
-        throw failure(Msg::taskDamaged, {name, std::to_string(fault.line),
-                                         fault.path.empty() ? "the document" : fault.path, fault.reason});
-    if (fault.status != QvStatus::ok) throw failure(Msg::taskRefused, {name, fault.reason});
+    requireTask(name);
     return {{"file", name}, {"task", "sound"}, {"bytes", fileBytes(name)}};
 }
 

@@ -10,9 +10,6 @@
 
 namespace {
 
-// Of a job whose input becomes shorter each time that it is read.
-constexpr int kMostAttempts = 3;
-
 // Options as they were given; they are parsed once the command runs.
 struct Given {
     JobOptions job;
@@ -58,18 +55,7 @@ void openEvents(Given& given, const std::string& version) {
 
 void transcode(Given& given, Signals& signals) {
     resolve(given);
-    for (int attempt = 1;; ++attempt) {
-        Job job(given.job, signals);
-        job.checkWarnings();
-        if (given.job.dryRun) return job.printPlan();
-        try {
-            return job.run();
-        } catch (const InputShrank& shrank) {
-            if (!given.job.acceptPartial || attempt == kMostAttempts) throw;
-            given.job.warnings.push_back(shrank.warning);
-            if (job.taskIsStream()) given.job.saveTask.clear();
-        }
-    }
+    runJob(given.job, [&] { return std::make_unique<Job>(given.job, signals); });
 }
 
 std::vector<std::string> outputFormats() {
@@ -106,6 +92,7 @@ void addTranscode(CommandLine& line, Signals& signals, const std::string& versio
                    "A command run afterwards; %i and %o stand for the inputs and outputs, %o1 for the first",
                    "CMD");
     command.option("--save-task", job.saveTask, "Write the job as a task file", "FILE");
+    command.flag("--relative", job.relative, "The task file names files as seen from its folder");
     given->progress.add(command);
     command.flag("--split-channels", job.splitChannels, "One WAV file a channel");
     command.flag("--accept-partial", job.acceptPartial, "Take what is there of a damaged input");

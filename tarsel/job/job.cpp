@@ -7,19 +7,36 @@
 #include "tarsel/job/keptchunks.h"
 #include "tarsel/job/outputpipe.h"
 #include "tarsel/job/savedtask.h"
+#include "tarsel/job/task/taskplan.h"
 #include "tarsel/words/messages.h"
 
 Job::Job(const JobOptions& options, Signals& signals)
     : options_(options),
       signals_(signals),
-      parts_{{}, {}, JobOutputs(options_), nullptr},
+      parts_{{}, {}, JobOutputs(options_), nullptr, nullptr},
       warnings_(options.warnings) {
     openInputs();
+    begin(planJob(options_, parts_.outputs.form(), readInputs()));
+}
+
+Job::Job(const JobOptions& options, std::unique_ptr<StoredTask> task, Signals& signals)
+    : options_(options),
+      signals_(signals),
+      parts_{{}, task->sources(), JobOutputs(options_), task->takePipe(), nullptr},
+      warnings_(options.warnings) {
+    parts_.stored = std::move(task);
+    begin(planTask(*parts_.stored, parts_.outputs.form(), readInputs(), options_.acceptPartial));
+}
+
+void Job::begin(JobPlan plan) {
+    parts_.plan = std::move(plan);
     lengths_ = InputLengths(parts_.sources);
-    parts_.plan = planJob(options_, parts_.outputs.form(), readInputs());
     warnings_.add(parts_.plan.warnings);
     warnings_.addEngine([this](const std::string& text) { return parts_.outputs.withFinalNames(text); });
-    parts_.pipe = makeOutputPipe(parts_.plan, options_.acceptPartial);
+    if (parts_.pipe)
+        fitToPlace(*parts_.pipe, parts_.plan, options_.acceptPartial);
+    else
+        parts_.pipe = makeOutputPipe(parts_.plan, options_.acceptPartial);
     carryChunks(parts_, warnings_);
     parts_.outputs.claim(parts_.plan, filesRead(), *parts_.pipe);
 }
@@ -48,6 +65,7 @@ std::vector<std::string> Job::filesRead() const {
     std::vector<std::string> files = parts_.plan.filterFiles.read;
     for (const auto& source : parts_.sources)
         files.insert(files.end(), source->files().begin(), source->files().end());
+    if (parts_.stored) files.push_back(parts_.stored->file());
     return files;
 }
 
@@ -59,11 +77,28 @@ void Job::printPlan() {
     {
         const Signals::Watch storing(signals_,
                                      {.first = {}, .second = [this] { return parts_.outputs.leave(); }});
-        saveTask(parts_, options_, warnings_, signals_);
+        saveTask(parts_, options_, signals_);
         parts_.outputs.commitTask();
     }
     printText(planText(parts_.plan));
     if (!options_.quiet) warnings_.show();
+}
+
+void runJob(JobOptions& options, const std::function<std::unique_ptr<Job>()>& make) {
+    // Of an input that becomes shorter each time that it is read.
+    constexpr int mostAttempts = 3;
+    for (int attempt = 1;; ++attempt) {
+        const std::unique_ptr<Job> job = make();
+        job->checkWarnings();
+        if (options.dryRun) return job->printPlan();
+        try {
+            return job->run();
+        } catch (const InputShrank& shrank) {
+            if (!options.acceptPartial || attempt == mostAttempts) throw;
+            options.warnings.push_back(shrank.warning);
+            if (job->taskIsStream()) options.saveTask.clear();
+        }
+    }
 }
 
 void Job::run() { JobRun(options_, parts_, lengths_, warnings_, signals_).run(); }

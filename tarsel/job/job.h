@@ -1,6 +1,9 @@
 // A transcode of the tool: its options become a plan, which is printed or run.
 #pragma once
 
+#include <functional>
+#include <memory>
+
 #include "tarsel/host/signals.h"
 #include "tarsel/job/inputlengths.h"
 #include "tarsel/job/joboptions.h"
@@ -11,6 +14,8 @@ class Job {
   public:
     // Opens the inputs, plans, and checks all names before any work. Throws Failure.
     Job(const JobOptions& options, Signals& signals);
+    // The same with a stored task, which is open; the options say where its output goes.
+    Job(const JobOptions& options, std::unique_ptr<StoredTask> task, Signals& signals);
 
     // With --strict: throws Failure if there is a warning.
     void checkWarnings() const;
@@ -22,6 +27,7 @@ class Job {
     bool taskIsStream() const { return parts_.outputs.taskIsStream(); }
 
   private:
+    void begin(JobPlan plan);
     void openInputs();
     std::vector<JobInput> readInputs() const;
     std::vector<std::string> filesRead() const;
@@ -32,3 +38,7 @@ class Job {
     InputLengths lengths_;
     Warnings warnings_;
 };
+
+// Makes the job, and prints or runs it; once more where an input has become shorter meanwhile and the options
+// take what is there. Throws Failure.
+void runJob(JobOptions& options, const std::function<std::unique_ptr<Job>()>& make);

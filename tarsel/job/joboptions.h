@@ -14,6 +14,7 @@ struct JobOptions : PlanOptions {
     ProgressMode progress;
     OutputPolicy policy{false};
     bool dryRun = false, quiet = false;
+    bool relative = false;              // the task file has names that count from its folder
     bool strict = false;                // warnings are failures
     std::vector<std::string> warnings;  // of earlier attempts
 };

@@ -55,7 +55,7 @@ class JobOutputs {
     std::string withFinalNames(std::string text) const;
 
   private:
-    const char* extension() const { return form_.extension(hasVideo_); }
+    std::string extension() const { return form_.extension(hasVideo_); }
     void checkNumbers(const JobPlan& plan);
     void checkNames(QvEncodePipe& pipe);
     void claimPlace(const std::string& place, const std::string& name);

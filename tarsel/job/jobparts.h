@@ -6,6 +6,7 @@
 
 #include "tarsel/job/joboutputs.h"
 #include "tarsel/job/plan/jobplan.h"
+#include "tarsel/job/task/storedtask.h"
 #include "tarsel/source/source.h"
 
 struct JobParts {
@@ -13,6 +14,7 @@ struct JobParts {
     std::vector<std::unique_ptr<Source>> sources;  // the inputs of the plan, open
     JobOutputs outputs;
     std::unique_ptr<QvEncodePipe> pipe;  // set up as the plan says
+    std::unique_ptr<StoredTask> stored;  // what the plan was made of; null for a job of the command line
 
     Source& source(const PlannedStream& stream) const {
         return *sources[static_cast<size_t>(stream.part.input)];

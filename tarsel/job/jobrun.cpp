@@ -42,7 +42,7 @@ void JobRun::run() {
                                             .last = lastWordOf(plan_.output),
                                             .file = plan_.output.name});
     checkSpace();
-    saveTask(parts_, options_, warnings_, signals_);
+    saveTask(parts_, options_, signals_);
     transcode(beginFilters());
     const std::vector<std::string> names = parts_.outputs.names();
     Events::get().wrote(names);

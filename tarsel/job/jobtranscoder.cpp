@@ -14,7 +14,10 @@ constexpr int kErrorLine = 2;  // type of a message of the engine
 }  // namespace
 
 JobTranscoder::JobTranscoder(JobParts& parts, Progress& progress)
-    : parts_(parts), progress_(progress), written_(parts.plan.streams.size(), -1) {}
+    : QvTranscoder(parts.stored ? &parts.stored->task() : nullptr),
+      parts_(parts),
+      progress_(progress),
+      written_(parts.plan.streams.size(), -1) {}
 
 void JobTranscoder::join(const std::vector<ProcessParams>& params) {
     setEncoder(parts_.pipe.get());
@@ -24,7 +27,9 @@ void JobTranscoder::join(const std::vector<ProcessParams>& params) {
     setParam("progress", off);
     for (size_t i = 0; i < params.size(); ++i) {
         const PlannedStream& s = parts_.plan.streams[i];
-        if (link(&parts_.source(s).decoder(), s.type, s.part.stream, s.number, params[i]) < 0)
+        if (parts_.stored)
+            linkFor(s)->setProcessParams(params[i]);
+        else if (link(&parts_.source(s).decoder(), s.type, s.part.stream, s.number, params[i]) < 0)
             throw failure(Msg::linkFailed, {parts_.plan.input(s).name});
     }
     first_ = linkOf(parts_.plan.streams.front());

@@ -36,9 +36,7 @@ class JobTranscoder : public QvTranscoder {
     const std::vector<long long>& written() const { return written_; }
     const std::optional<Failure>& filterFailure() const { return filterFailure_; }
     // Null for a stream that was not joined.
-    const TransLink* linkOf(const PlannedStream& stream) const {
-        return getLinkForOutput(stream.type, stream.number);
-    }
+    const TransLink* linkOf(const PlannedStream& stream) const { return linkFor(stream); }
     // Why the run failed: a link knows it better than the log, and that better than the run.
     std::string reason() const;
 
@@ -50,6 +48,9 @@ class JobTranscoder : public QvTranscoder {
     void cbDone(int result) override;
 
   private:
+    TransLink* linkFor(const PlannedStream& stream) const {
+        return getLinkForOutput(stream.type, stream.number);
+    }
     ProgressState state(const char* name) const;
     ProgressState stateAt(long long units, const char* name) const;
     ProgressState measuringState() const;

@@ -20,7 +20,6 @@ void setMuxer(QvEncodePipe& pipe, const OutputForm& output) {
     }
     const bool toStream = output.takesOneStream() || output.place == OutputPlace::nullDevice;
     if (output.splitChannels && !toStream) setChecked(m, "splitAudio", 1, "--split-channels");
-    if (output.takesOneStream()) m.setParam("exactName", 1);
 }
 
 void setPicture(QvEncoder& encoder, const PictureFormat& picture) {
@@ -39,7 +38,7 @@ void setSound(QvEncoder& encoder, const SoundFormat& sound) {
 }
 
 void addStream(QvEncodePipe& pipe, const OutputForm& output, const PlannedStream& stream) {
-    if (pipe.addStream(stream.type, Any(stream.encoder())) < 0)
+    if (pipe.addStream(stream.type, Any(stream.encoder().c_str())) < 0)
         throw failure(Msg::outputNoStream, {output.name, stream.isVideo() ? "picture" : "sound"});
     QvEncoder& encoder = *pipe.encoder(stream.type, stream.number);
     stream.isVideo() ? setPicture(encoder, stream.picture) : setSound(encoder, stream.sound);
@@ -58,13 +57,17 @@ std::unique_ptr<QvEncodePipe> makeOutputPipe(const JobPlan& plan, bool acceptPar
     }
     pipe->clearStreams();
     setMuxer(*pipe, output);
-    for (const PlannedStream& stream : plan.streams) {
-        addStream(*pipe, output, stream);
-        // The header of a stream goes ahead of the sound; what may end early promises no length.
-        if (!stream.isVideo() && output.takesOneStream() && !acceptPartial)
-            pipe->getMuxer()
-                ->stream(stream.type, stream.number)
-                ->setParam("expectedSamples", Any(stream.expected));
-    }
+    for (const PlannedStream& stream : plan.streams) addStream(*pipe, output, stream);
+    fitToPlace(*pipe, plan, acceptPartial);
     return pipe;
+}
+
+void fitToPlace(QvEncodePipe& pipe, const JobPlan& plan, bool acceptPartial) {
+    const bool toStream = plan.output.takesOneStream();
+    QvMuxer& muxer = *pipe.getMuxer();
+    if (std::string_view(muxer.name()) == "rawmux") muxer.setParam("exactName", toStream ? 1 : 0);
+    if (!toStream || acceptPartial) return;
+    for (const PlannedStream& stream : plan.streams)
+        if (!stream.isVideo())
+            muxer.stream(stream.type, stream.number)->setParam("expectedSamples", Any(stream.expected));
 }

@@ -1,29 +1,27 @@
 #include "tarsel/job/savedtask.h"
 
-#include <cerrno>
-#include <cstring>
+#include <filesystem>
 
+#include "tarsel/job/task/storedtask.h"
 #include "tarsel/words/messages.h"
+
+namespace fs = std::filesystem;
 
 namespace {
 
-// Without it a task gives a file the extension of its kind.
-bool keepsExactName(const JobParts& parts, const JobOptions& options, Warnings& warnings) {
+// An application that runs the task would otherwise get the extension of its kind.
+bool keepsExactName(const JobParts& parts, const JobOptions& options) {
     const OutputForm& form = parts.plan.output;
-    const std::string stem = QvFile::stripExt(Any(options.output.c_str())).asString(""),
-                      kinds = stem + "." + form.extension(parts.plan.hasVideo());
-    const bool files =
+    const bool file =
         form.isFiles() && !form.numbered && (form.kind == OutputKind::raw || form.kind == OutputKind::wav);
-    if (!files || kinds == options.output) return false;
-    if (parts.plan.streams.size() == 1 && !form.splitChannels) return true;
-    if (parts.plan.hasVideo())
-        warnings.add(lineOf(Msg::taskNamesOther, {options.saveTask, options.output, kinds}));
-    return false;
+    const std::string stem = QvFile::stripExt(Any(options.output.c_str())).asString("");
+    return file && parts.plan.streams.size() == 1 && !form.splitChannels &&
+           options.output != stem + "." + form.extension(parts.plan.hasVideo());
 }
 
 }  // namespace
 
-void saveTask(JobParts& parts, const JobOptions& options, Warnings& warnings, Signals& signals) {
+void saveTask(JobParts& parts, const JobOptions& options, Signals& signals) {
     if (!parts.outputs.hasTask()) return;
     QvTask task;
     task.setEncoder(parts.pipe.get());
@@ -33,20 +31,16 @@ void saveTask(JobParts& parts, const JobOptions& options, Warnings& warnings, Si
     if (const std::string name = parts.outputs.storedName(); !name.empty())
         parts.pipe->setFilename(Any(name.c_str()));
     if (!options.post.empty()) task.setPostprocessCommand(options.post.c_str());
-    const bool exact = keepsExactName(parts, options, warnings);
+    const bool exact = keepsExactName(parts, options);
     if (exact) parts.pipe->getMuxer()->setParam("exactName", 1);
     AnyDict state;
     task.store(state);
     if (exact) parts.pipe->getMuxer()->setParam("exactName", 0);
     const Signals::Watch storing(signals, {.first = {}, .second = [&] { return parts.outputs.leave(); }});
-    const std::string name = parts.outputs.beginTask();
-    std::string reason;
-    try {
-        errno = 0;
-        if (XmlParser::storeDict(Any(name.c_str()), state, "TranscodeTask", Any("2.0")) != QvStatus::ok)
-            reason = "the job can't be stored";
-    } catch (const QvFileException& error) {
-        reason = errno != 0 ? std::string(": ") + std::strerror(errno) : error.what();
-    }
+    if (options.relative)
+        makeRelative(state, fs::path(options.saveTask).parent_path().string());
+    else
+        makeAbsolute(state);
+    const std::string reason = writeTask(state, parts.outputs.beginTask());
     if (!reason.empty()) throw writeFailure(options.saveTask, parts.outputs.withFinalNames(reason));
 }

@@ -3,8 +3,7 @@
 
 #include "tarsel/host/signals.h"
 #include "tarsel/job/jobparts.h"
-#include "tarsel/job/warnings.h"
 
 // Writes it where the outputs say, if there is to be one. A stream that waits for its reader is left at the
-// first signal. What the task will name otherwise is a warning. Throws Failure.
-void saveTask(JobParts& parts, const JobOptions& options, Warnings& warnings, Signals& signals);
+// first signal. Throws Failure.
+void saveTask(JobParts& parts, const JobOptions& options, Signals& signals);

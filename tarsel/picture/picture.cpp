@@ -490,17 +490,34 @@ std::unique_ptr<QvVProcessPipe> tryPipe(const VideoJobDescription& job) {
     return pipe;
 }
 
+namespace {
+
+std::string described(const std::string& name, const AnyDict& state) {
+    std::string line = name;
+    const std::unique_ptr<QvCodec> fresh(qv_registry()->newCodec(name.c_str()));
+    AnyDict initial;
+    if (fresh) fresh->store(initial);
+    addSettings(state, initial, line);
+    return line;
+}
+
+}  // namespace
+
 std::vector<std::string> describe(const QvVProcessPipe* pipe) {
     std::vector<std::string> lines;
     for (int i = 0; pipe && i < pipe->nrFilters(); ++i) {
-        const QvVideoFilter& filter = *pipe->filter(i);
-        std::string line = filter.name();
-        const std::unique_ptr<QvCodec> fresh(qv_registry()->newCodec(filter.name()));
-        AnyDict state, initial;
-        filter.store(state);
-        if (fresh) fresh->store(initial);
-        addSettings(state, initial, line);
-        lines.push_back(line);
+        AnyDict state;
+        pipe->filter(i)->store(state);
+        lines.push_back(described(pipe->filter(i)->name(), state));
     }
+    return lines;
+}
+
+std::vector<std::string> describe(const FiltersState& filters) {
+    std::vector<std::string> lines;
+    const AnyVector names = filters.names();
+    for (int i = 0; i < filters.count(); ++i)
+        if (const AnyDict& state = filters.filterAt(i); state.get("_on").isTrue())
+            lines.push_back(described(names.at(i).asString(""), state));
     return lines;
 }

@@ -87,3 +87,4 @@ FilterFiles filterFiles(const QvVProcessPipe& pipe);
 std::unique_ptr<QvVProcessPipe> tryPipe(const VideoJobDescription& job);
 // A line for each filter of a pipe: its name and its parameters.
 std::vector<std::string> describe(const QvVProcessPipe* pipe);
+std::vector<std::string> describe(const FiltersState& filters);  // those that are on

@@ -124,14 +124,18 @@ Source::Source(const std::string& spec, const std::string& raw) : name_(spec) {
         isFile_ = false;
         if (!raw.empty()) throw failure(Msg::rawNoFile, {spec});
         openGenerator(spec);
-        return;
+    } else {
+        files_.push_back(spec);
+        requireInput(spec);
+        raw.empty() ? openFile() : openRaw(raw);
     }
-    files_.push_back(spec);
-    requireInput(spec);
-    if (raw.empty())
-        openFile();
-    else
-        openRaw(raw);
+    open_ = decoder_.get();
+}
+
+Source::Source(QvDecodePipe& decoder) : open_(&decoder) {
+    name_ = decoder.QvCodec::getParam("filename").toString().asString("");
+    isFile_ = !decoder.QvCodec::getParam("isMeta").isTrue();
+    if (isFile_) files_.push_back(name_);
 }
 
 bool Source::describesItself(const std::string& spec) {
@@ -284,8 +288,8 @@ void Source::openFile() {
 long long Source::bytes() const { return isFile_ ? fileBytes(name_) : -1; }
 
 std::optional<QvFramerate> Source::frameRate() const {
-    if (decoder_->nrStreams(1) == 0) return std::nullopt;
-    const Any rate = decoder_->getVideoParam(0, "framerate");
+    if (open_->nrStreams(1) == 0) return std::nullopt;
+    const Any rate = open_->getVideoParam(0, "framerate");
     if (!rate.isFramerate()) return std::nullopt;
     return rate.asFramerate();
 }
@@ -293,34 +297,34 @@ std::optional<QvFramerate> Source::frameRate() const {
 double Source::duration() const {
     double longest = -1;
     for (int type : {1, 2})
-        for (int i = 0; i < decoder_->nrStreams(type); ++i) {
-            const Any seconds = decoder_->getStreamParam(type, i, "duration");
+        for (int i = 0; i < open_->nrStreams(type); ++i) {
+            const Any seconds = open_->getStreamParam(type, i, "duration");
             if (seconds.isDouble()) longest = std::max(longest, seconds.asDouble());
         }
-    if (decoder_->nrStreams(1) + decoder_->nrStreams(2) > 0) return longest;
-    for (int i = 0; i < decoder_->nrStreams(kSubpicture); ++i)
-        longest = std::max(longest, decoder_->duration(kSubpicture, i).seconds());
+    if (open_->nrStreams(1) + open_->nrStreams(2) > 0) return longest;
+    for (int i = 0; i < open_->nrStreams(kSubpicture); ++i)
+        longest = std::max(longest, open_->duration(kSubpicture, i).seconds());
     return longest;
 }
 
 void Source::selectAll() {
     for (int type : {1, 2})
-        for (int i = 0; i < decoder_->nrStreams(type); ++i)
-            if (decoder_->select(type, i) != QvStatus::ok)
+        for (int i = 0; i < open_->nrStreams(type); ++i)
+            if (open_->select(type, i) != QvStatus::ok)
                 throw failure(Msg::streamRefused, {name_, type == 1 ? "video" : "audio", std::to_string(i)});
 }
 
 std::string Source::damage() const {
-    for (int i = 0; i < decoder_->nrStreams(kSubpicture); ++i)
-        if (const long long bytes = decoder_->getStreamParam(kSubpicture, i, "unread").asInt64(0); bytes > 0)
+    for (int i = 0; i < open_->nrStreams(kSubpicture); ++i)
+        if (const long long bytes = open_->getStreamParam(kSubpicture, i, "unread").asInt64(0); bytes > 0)
             return "the last " + std::to_string(bytes) + " bytes of its text can't be read";
     for (int type : {1, 2})
-        for (int i = 0; i < decoder_->nrStreams(type); ++i) {
+        for (int i = 0; i < open_->nrStreams(type); ++i) {
             AnyDict params;
-            decoder_->getStreamParams(type, i, params);
+            open_->getStreamParams(type, i, params);
             if (!params.get("truncated").isTrue()) continue;
             const bool video = type == 1;
-            const long long present = video ? decoder_->nrFrames(i) : decoder_->nrSamples(i);
+            const long long present = video ? open_->nrFrames(i) : open_->nrSamples(i);
             const long long expected = params.getInt64(video ? "framesExpected" : "samplesExpected", present);
             if (video && !params.isSet("samplesExpected") && expected == present + 1)
                 return "it ends in the middle of frame " + std::to_string(expected) + ", after " +

@@ -13,12 +13,14 @@ class Source {
     // `spec`: a file name, or "testgen:size=1280x720,rate=25,duration=10". `raw`: the format of a raw file
     // ("size=352x288,pixel=I420,rate=25"), empty to open by extension. Throws Failure.
     Source(const std::string& spec, const std::string& raw);
+    // One that is open already; it has to outlive this.
+    explicit Source(QvDecodePipe& decoder);
 
     // Whether an input of this name needs no format from outside: the generator, or an extension with a
     // decoder.
     static bool describesItself(const std::string& spec);
 
-    QvDecodePipe& decoder() const { return *decoder_; }
+    QvDecodePipe& decoder() const { return *open_; }
     const std::string& name() const { return name_; }
     // Bytes of the file; negative when it is none.
     long long bytes() const;
@@ -46,7 +48,8 @@ class Source {
     std::string name_;
     bool isFile_ = true;
     std::vector<std::string> files_;
-    std::unique_ptr<QvDecodePipe> decoder_;
+    std::unique_ptr<QvDecodePipe> decoder_;  // null where it belongs to another
+    QvDecodePipe* open_ = nullptr;
 };
 
 // Sets a parameter that the decoder, encoder or filter must know; throws Failure (usage) for an unknown name

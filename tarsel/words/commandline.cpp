@@ -163,6 +163,17 @@ void Command::argument(const char* name, std::string& to, const char* help, Need
     app_.add_option(name, to, help)->required(need == Need::required);
 }
 
+void Command::choiceArgument(const char* name, std::string& to, const char* help,
+                             const std::vector<std::string>& values) {
+    const auto known = [name, values](const std::string& word) {
+        if (std::find(values.begin(), values.end(), word) == values.end())
+            throw failure(Msg::choiceUnknown, {name, word, suggestion(word, values), joined(values)});
+        return std::string();
+    };
+    line_.taken_.push_back(
+        {app_.add_option(name, to, help)->required()->check(known), CommandLine::Kind::value, values, {}});
+}
+
 void Command::arguments(const char* name, std::vector<std::string>& to, const char* help, int most) {
     CLI::Option* words = app_.add_option(name, to, help)->required();
     if (most > 0) words->expected(1, most);
@@ -256,16 +267,20 @@ std::vector<OptionText> CommandLine::describedOptions(const CLI::App& app) const
     return all;
 }
 
+std::vector<std::string> CommandLine::valuesOf(const CLI::Option& option) const {
+    for (const Taken& row : taken_)
+        if (row.option == &option) return row.values;
+    return {};
+}
+
 ToolText CommandLine::described() const {
     ToolText tool{app_->get_name(), app_->get_description(), version_, describedOptions(*app_), {}};
     for (const CLI::App* sub : app_->get_subcommands({})) {
         CommandText command{sub->get_name(), sub->get_description(), {}, describedOptions(*sub)};
         for (const CLI::Option* option : sub->get_options())
             if (option->get_positional())
-                command.arguments.push_back({option->get_name(true),
-                                             option->get_description(),
-                                             {},
-                                             option->get_required(),
+                command.arguments.push_back({option->get_name(true), option->get_description(),
+                                             valuesOf(*option), option->get_required(),
                                              option->get_expected_max() > 1});
         if (command.name == "help") command.arguments.front().values = commandNames(*app_);
         if (command.name == "completion") command.arguments.front().values = kShells;

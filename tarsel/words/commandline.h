@@ -54,6 +54,7 @@ class CommandLine {
 
   private:
     void addTexts();
+    std::vector<std::string> valuesOf(const CLI::Option& option) const;
     std::vector<OptionText> describedOptions(const CLI::App& app) const;
 
     std::unique_ptr<CLI::App> app_;
@@ -71,6 +72,9 @@ class Command {
 
     // The words that are no options: one, or up to `most` of them, and at least one.
     void argument(const char* name, std::string& to, const char* help, Need need = Need::required);
+    // A word that is one of `values`.
+    void choiceArgument(const char* name, std::string& to, const char* help,
+                        const std::vector<std::string>& values);
     void arguments(const char* name, std::vector<std::string>& to, const char* help,
                    int most = 0);  // 0: any number
 

@@ -8,7 +8,7 @@
 
 #include "tarsel/words/failure.h"
 
-enum class Msg : unsigned char {
+enum class Msg : unsigned short {
     // the command line
     commandMissing,
     commandUnknown,
@@ -71,6 +71,12 @@ enum class Msg : unsigned char {
     inputDamaged,
     taskDamaged,
     taskRefused,
+    taskManyStreams,
+    taskPostLeft,
+    taskRelinkWrong,
+    taskRelinkNothing,
+    taskRelinkWords,
+    taskWords,
     fileDamaged,
     inputEndedEarly,
     inputDamagedTaken,
@@ -266,7 +272,6 @@ enum class Msg : unsigned char {
     postNotRun,
     postFailed,
     taskFailed,
-    taskNamesOther,
     doneUnsaid,
     engineWarns,
     outOfMemory,

@@ -7,8 +7,18 @@
 
 namespace {
 
-// The time at the start of the sound that a filter lets the link skip.
-MediaTime skippedBy(const FiltersState& filters, const SoundFormat& in, const SoundFormat& out) {
+// Filters of so many channels leave others silent, which no one means.
+void requireChannels(const AnyDict& filter, int channels) {
+    const std::string name = filter.getString("name", "");
+    const int most =
+        makeAnyCodec(name, QvModuleType::audioFilter)->getParam("_maxChannels").asInt32(channels);
+    if (channels > most)
+        throw failure(Msg::filterChannels, {name, std::to_string(channels), std::to_string(most)});
+}
+
+}  // namespace
+
+MediaTime skippedSound(const FiltersState& filters, const SoundFormat& in, const SoundFormat& out) {
     AudioJobDescription job;
     job.inSamplerate = in.samplerate;
     job.inChannels = in.channels;
@@ -20,22 +30,13 @@ MediaTime skippedBy(const FiltersState& filters, const SoundFormat& in, const So
     MediaTime skipped;
     try {
         const std::unique_ptr<QvAProcessPipe> pipe(QvProcessUtil::createAudioPipe(job, skipped));
+    } catch (const QvMemoryFailure&) {
+        throw;
     } catch (const QvAssertFailure& failure) {
         throw ::failure(Msg::chainRefused, {failure.what()});
     }
     return skipped;
 }
-
-// Filters of so many channels leave others silent, which no one means.
-void requireChannels(const AnyDict& filter, int channels) {
-    const std::string name = filter.getString("name", "");
-    const int most =
-        makeAnyCodec(name, QvModuleType::audioFilter)->getParam("_maxChannels").asInt32(channels);
-    if (channels > most)
-        throw failure(Msg::filterChannels, {name, std::to_string(channels), std::to_string(most)});
-}
-
-}  // namespace
 
 FilterPlanner::FilterPlanner(JobPlan& plan, const EffectOptions& options) : plan_(plan), options_(options) {
     for (PlannedStream& stream : plan.streams) {
@@ -92,5 +93,5 @@ void FilterPlanner::planSound(PlannedStream& stream) const {
     if (in.channels != out.channels) require("chconvert");
     // Filters work on 32 bits.
     if (in.bits != out.bits || !stream.filters.empty()) require("aquant");
-    if (!stream.filters.empty()) stream.skipped = skippedBy(stream.filters, in, out);
+    if (!stream.filters.empty()) stream.skipped = skippedSound(stream.filters, in, out);
 }

@@ -7,6 +7,10 @@
 
 struct JobPlan;
 struct PlannedStream;
+struct SoundFormat;
+
+// The time at the start of the sound that filters let the link skip.
+MediaTime skippedSound(const FiltersState& filters, const SoundFormat& in, const SoundFormat& out);
 
 class FilterPlanner {
   public:

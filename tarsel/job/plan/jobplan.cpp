@@ -21,15 +21,6 @@ int count(const JobPlan& plan, int type) {
                                           [&](const auto& s) { return s.type == type; }));
 }
 
-// A cut input is refused unless the user takes what is there.
-void checkDamage(JobPlan& plan, bool acceptPartial) {
-    for (const JobInput& input : plan.inputs) {
-        if (input.damage.empty()) continue;
-        if (!acceptPartial) throw failure(Msg::inputDamaged, {input.name, input.damage});
-        plan.warnings.push_back(lineOf(Msg::inputDamagedTaken, {input.name, input.damage}));
-    }
-}
-
 SoundFormat soundFormat(const PlanOptions& options, const SoundFormat& in) {
     return {options.samplerate.value_or(in.samplerate), options.channels.value_or(in.channels),
             options.bits.value_or(in.bits)};
@@ -117,6 +108,7 @@ std::string formatOf(const PlannedStream& stream) {
 }  // namespace
 
 long long PlannedStream::bytes(long long units) const {
+    if (!isRaw()) return 0;
     if (!isVideo()) return units * sound.channels * ((sound.bits + 7) / 8);
     QvFrame shape;
     if (shape.init(picture.fourcc, picture.width, picture.height) != QvStatus::ok) throw std::bad_alloc();
@@ -144,6 +136,14 @@ long long JobPlan::bytes() const {
     long long total = 0;
     for (const PlannedStream& stream : streams) total += stream.bytes(stream.expected);
     return total;
+}
+
+void checkDamage(JobPlan& plan, bool acceptPartial) {
+    for (const JobInput& input : plan.inputs) {
+        if (input.damage.empty()) continue;
+        if (!acceptPartial) throw failure(Msg::inputDamaged, {input.name, input.damage});
+        plan.warnings.push_back(lineOf(Msg::inputDamagedTaken, {input.name, input.damage}));
+    }
 }
 
 JobPlan planJob(const PlanOptions& options, const OutputForm& output, std::vector<JobInput> inputs) {

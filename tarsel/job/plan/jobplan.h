@@ -24,6 +24,7 @@ struct PlannedStream {
     int type = qvVideoStream;  // or qvAudioStream
     int number = 0;            // among those of its type in the output
     StreamPart part;
+    std::string module;  // encoder of a stored task; empty for the one that writes raw streams
     // The format that is written.
     PictureFormat picture;           // of video
     SoundFormat sound;               // of audio
@@ -36,9 +37,11 @@ struct PlannedStream {
     long long frame = 0;     // audio: most samples that belong to one frame of the picture; 0 without one
 
     bool isVideo() const { return type == qvVideoStream; }
-    const char* encoder() const { return isVideo() ? "rawvenc" : "rawaenc"; }
+    std::string encoder() const { return module.empty() ? isVideo() ? "rawvenc" : "rawaenc" : module; }
+    // The count of bytes is known beforehand.
+    bool isRaw() const { return encoder() == (isVideo() ? "rawvenc" : "rawaenc"); }
     const char* unit() const { return isVideo() ? "frames" : "samples"; }
-    long long bytes(long long units) const;  // without headers
+    long long bytes(long long units) const;  // without headers; 0 for what an encoder compresses
     ProcessParams params() const;
 };
 
@@ -58,6 +61,9 @@ struct JobPlan {
 
 // Throws Failure for what can't be done. The engine has to be started, for its filters.
 JobPlan planJob(const PlanOptions& options, const OutputForm& output, std::vector<JobInput> inputs);
+
+// Throws Failure for a damaged input, unless what is there of it is to be taken: then it is a warning.
+void checkDamage(JobPlan& plan, bool acceptPartial);
 
 // What --dry-run prints: a line for each input, stream, filter, encoder and length, and one for the output.
 std::string planText(const JobPlan& plan);

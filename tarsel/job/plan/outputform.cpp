@@ -29,6 +29,7 @@ std::string formatName(const PlanOptions& options) {
 }
 
 OutputKind kindOf(const PlanOptions& options, OutputPlace place) {
+    if (options.kind) return *options.kind;
     const std::string extension = formatName(options);
     for (const KindRow& row : kKinds)
         if (extension == row.extension) return row.kind;
@@ -50,7 +51,7 @@ OutputKind kindOf(const PlanOptions& options, OutputPlace place) {
 // A name such as "x.uyvy" says the pixel format.
 std::string pixelOf(const PlanOptions& options, OutputKind kind) {
     const std::string& given = options.effects.pixel;
-    const RawName* name = kind == OutputKind::raw ? rawName(formatName(options)) : nullptr;
+    const RawName* name = kind == OutputKind::raw && !options.kind ? rawName(formatName(options)) : nullptr;
     if (!name || name->fourcc == 0) return given;
     if (given.empty()) return fourccText(name->fourcc);
     const unsigned fourcc = parsePixel(given, "--pixel");
@@ -61,7 +62,7 @@ std::string pixelOf(const PlanOptions& options, OutputKind kind) {
 
 void checkMuxer(const PlanOptions& options, OutputKind kind) {
     const char* const writer = kind == OutputKind::avi ? "rawavimux" : "rawmux";
-    if (!options.muxer.empty() && options.muxer != writer)
+    if (!options.kind && !options.muxer.empty() && options.muxer != writer)
         throw failure(Msg::muxerOther, {options.muxer, options.output, writer});
 }
 
@@ -89,14 +90,16 @@ void takeNumbers(const PlanOptions& options, OutputForm& form) {
 
 const char* OutputForm::muxer() const {
     if (writesNothing()) return "nullmux";
+    if (kind == OutputKind::module) return muxerModule.c_str();
     return kind == OutputKind::avi ? "rawavimux" : "rawmux";
 }
 
-const char* OutputForm::extension(bool hasVideo) const {
+std::string OutputForm::extension(bool hasVideo) const {
     switch (kind) {
         case OutputKind::wav: return "wav";
         case OutputKind::avi: return "avi";
         case OutputKind::pictures: return "png";
+        case OutputKind::module: return extensionOf(name);
         default: return hasVideo ? "raw" : "wav";
     }
 }
@@ -111,6 +114,7 @@ OutputForm outputForm(const PlanOptions& options, OutputPlace place) {
     if (place == OutputPlace::nowhere) return form;
     form.kind = kindOf(options, place);
     checkMuxer(options, form.kind);
+    if (form.kind == OutputKind::module) form.muxerModule = options.muxer;
     form.pixel = pixelOf(options, form.kind);
     if (form.takesOneStream()) checkStream(options, form.kind);
     if (form.isFiles()) takeNumbers(options, form);

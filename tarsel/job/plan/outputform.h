@@ -7,15 +7,6 @@
 #include "tarsel/job/plan/planoptions.h"
 #include "tarsel/words/numberedname.h"
 
-enum class OutputKind {
-    raw,
-    wav,
-    pictures,  // a sequence of PNG files
-    avi,
-    nothing,
-    byInput,  // a stream whose name does not say it: raw pictures, or WAV where there is no picture
-};
-
 enum class OutputPlace {
     nowhere,
     files,
@@ -31,12 +22,14 @@ struct OutputForm {
     std::optional<NumberedName> numbered;
     bool splitChannels = false;  // a file for each channel
 
+    std::string muxerModule;  // of OutputKind::module
+
     bool isFiles() const { return place == OutputPlace::files; }
     bool takesOneStream() const { return place == OutputPlace::stream; }
     bool writesNothing() const { return kind == OutputKind::nothing || place == OutputPlace::nullDevice; }
     // The engine's modules and the extension of its first file.
     const char* muxer() const;
-    const char* extension(bool hasVideo) const;
+    std::string extension(bool hasVideo) const;
 };
 
 // The form of an output that is `place`. Throws Failure for a name or a format that means nothing, or that

@@ -8,10 +8,21 @@
 
 #include "tarsel/picture/effects.h"
 
+enum class OutputKind {
+    raw,
+    wav,
+    pictures,  // a sequence of PNG files
+    avi,
+    module,  // what the multiplexer of a stored task writes
+    nothing,
+    byInput,  // a stream whose name does not say it: raw pictures, or WAV where there is no picture
+};
+
 struct PlanOptions {
     std::vector<std::string> inputs;
     std::string output, format, muxer, saveTask;
     std::string from, to, duration;
+    std::optional<OutputKind> kind;  // of a stored task's output, whatever its name says
     EffectOptions effects;
     std::optional<int> samplerate, channels, bits;
     bool noVideo = false, noAudio = false;

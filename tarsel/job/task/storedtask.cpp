@@ -70,7 +70,8 @@ void makeRelative(AnyDict& state, const std::string& folder) {
 
 StoredTask::StoredTask(const std::string& file) : file_(file) {
     requireTask(file);
-    if (XmlParser::restoreDict(Any(file.c_str()), raw_, kClass) != QvStatus::ok)
+    Any root, version;
+    if (XmlParser::restoreDict(Any(file.c_str()), raw_, root, version) != QvStatus::ok)
         throw failure(Msg::taskRefused, {file, "it can't be read"});
     const fs::path folder = fs::absolute(file).parent_path();
     AnyDict state = raw_;
@@ -113,10 +114,12 @@ void StoredTask::open() {
     pipe_.reset(pipe);
     if (!report.file.empty()) throw failure(Msg::inputRefused, {report.file, report.reason});
     if (!task_) throw failure(Msg::taskRefused, {file_, error.toString().asString("it can't be restored")});
+    task_->setPostprocessCommand(Any());  // a run of the engine would run it
 }
 
 std::vector<std::unique_ptr<Source>> StoredTask::sources() const {
     std::vector<std::unique_ptr<Source>> sources;
-    for (QvDecodePipe* const decoder : task_->decoders()) sources.push_back(std::make_unique<Source>(*decoder));
+    for (QvDecodePipe* const decoder : task_->decoders())
+        sources.push_back(std::make_unique<Source>(*decoder));
     return sources;
 }

@@ -29,7 +29,8 @@ class StoredTask {
     // The command that runs afterwards, with its placeholders; "" for none.
     std::string postProcess() const;
 
-    // Opens the inputs and makes the output, which opens nothing yet. Throws Failure.
+    // Opens the inputs and makes the output, which opens nothing yet. The task has no command for afterwards
+    // then: who wants it runs postProcess(). Throws Failure.
     void open();
     // After open. The sources are the decoders of the task's links, each once.
     QvTask& task() const { return *task_; }

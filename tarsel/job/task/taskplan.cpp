@@ -1,0 +1,108 @@
+#include "tarsel/job/task/taskplan.h"
+
+#include <algorithm>
+#include <cstring>
+
+#include "tarsel/job/plan/filters.h"
+#include "tarsel/job/plan/lengths.h"
+#include "tarsel/words/messages.h"
+
+namespace {
+
+bool has(const QvEncodePipe& pipe, int type) { return pipe.nrStreams(type) > 0; }
+
+bool isOn(const QvMuxer& muxer, const char* param) {
+    try {
+        return muxer.QvCodec::getParam(param).isTrue();
+    } catch (const QvParamException&) {  // not one of its parameters
+        return false;
+    }
+}
+
+void readPicture(const QvCodec& encoder, PictureFormat& format) {
+    const auto ask = [&](const char* name) { return encoder.getParam(name); };
+    format.width = ask("width").asInt32(format.width);
+    format.height = ask("height").asInt32(format.height);
+    if (const Any rate = ask("framerate"); rate.isFramerate()) format.rate = rate.asFramerate();
+    const Any type = std::strcmp(encoder.name(), "rawvenc") == 0 ? ask("type") : ask("FOURCC");
+    format.fourcc = static_cast<unsigned>(type.asInt32(static_cast<int>(format.fourcc)));
+}
+
+void readSound(const QvCodec& encoder, SoundFormat& format) {
+    const auto ask = [&](const char* name, int otherwise) {
+        return encoder.getParam(name).asInt32(otherwise);
+    };
+    format = {ask("samplerate", format.samplerate), ask("channels", format.channels),
+              ask("bitsPerSample", format.bits)};
+}
+
+void readPoints(const ProcessParams& params, const MediaTime& length, StreamPart& part) {
+    part.out = length;
+    const auto points = params.inOutPoints();
+    if (!points || points->count() == 0) return;
+    part.whole = false;
+    part.in = points->inPoint();
+    if (points->outPoint() > MediaTime() && points->outPoint() < length) part.out = points->outPoint();
+}
+
+void readFilters(PlannedStream& stream, FilterFiles& files) {
+    stream.chain = describe(stream.filters);
+    changeFilterFiles(stream.filters, [&](const std::string& file, const char* filter, bool writes) {
+        if (writes)
+            files.written.push_back({file, filter});
+        else
+            files.read.push_back(file);
+        return file;
+    });
+}
+
+PlannedStream plannedStream(JobPlan& plan, const TransLink& link, int input) {
+    PlannedStream stream;
+    stream.type = link.type();
+    stream.number = link.encStreamNr();
+    stream.part.input = input;
+    stream.part.stream = link.decStreamNr();
+    const InputStream& source = plan.source(stream);
+    const QvCodec& encoder = *link.encoder()->encoder(stream.type, stream.number);
+    stream.module = encoder.name();
+    stream.picture = source.picture;
+    stream.sound = source.sound;
+    stream.isVideo() ? readPicture(encoder, stream.picture) : readSound(encoder, stream.sound);
+    const ProcessParams& params = link.processParams();
+    readPoints(params, source.end(), stream.part);
+    if (const auto filters = params.filters()) stream.filters = *filters;
+    readFilters(stream, plan.filterFiles);
+    if (!stream.isVideo() && !stream.filters.empty())
+        stream.skipped = skippedSound(stream.filters, source.sound, stream.sound);
+    return stream;
+}
+
+}  // namespace
+
+OutputKind taskOutputKind(const StoredTask& task) {
+    const QvEncodePipe& pipe = *task.task().encoder();
+    const QvMuxer* const muxer = pipe.getMuxer();
+    const std::string name = muxer ? muxer->name() : "nullmux";
+    if (name == "nullmux") return OutputKind::nothing;
+    if (name == "rawavimux") return OutputKind::avi;
+    if (name != "rawmux") return OutputKind::module;
+    if (!has(pipe, qvVideoStream)) return OutputKind::wav;
+    return isOn(*muxer, "rawAsPng") ? OutputKind::pictures : OutputKind::raw;
+}
+
+JobPlan planTask(const StoredTask& task, const OutputForm& output, std::vector<JobInput> inputs,
+                 bool acceptPartial) {
+    JobPlan plan;
+    plan.output = output;
+    plan.inputs = std::move(inputs);
+    checkDamage(plan, acceptPartial);
+    if (output.takesOneStream() && task.task().nrLinks() != 1)
+        throw failure(Msg::taskManyStreams, {output.name, std::to_string(task.task().nrLinks())});
+    const QvDPipeList& decoders = task.task().decoders();
+    for (const TransLink* const link : task.task().links())
+        plan.streams.push_back(plannedStream(plan, *link, decoders.indexOf(link->decoder())));
+    if (plan.streams.empty()) throw failure(Msg::taskRefused, {task.file(), "nothing feeds its output"});
+    planFrames(plan);
+    planSamples(plan);
+    return plan;
+}

@@ -1,0 +1,143 @@
+// Jobs that are kept as task files, and run from them.
+#include "tests/system/tool.h"
+
+namespace {
+
+using testing::HasSubstr;
+using testing::Not;
+
+class Task : public Tool {
+  protected:
+    void SetUp() override {
+        Tool::SetUp();
+        folder.write("in.wav", riff(wavChunk("fmt ", wavFormat(1, 2, 8000, 16)) +
+                                    wavChunk("data", patternBytes(4000 * 4))));
+        folder.write("talk.srt", "1\n00:00:00,000 --> 00:00:01,000\nHi\n");
+    }
+
+    void makeFolder(const char* name) { std::filesystem::create_directory(folder.path() / name); }
+
+    // A run of the saved task writes what the job wrote.
+    void expectSameBytes(const Words& job, const Words& outputs) {
+        works(Words{"transcode"} + job + Words{"--save-task", "job.xml", "-y"});
+        std::vector<std::string> before;
+        for (const auto& name : outputs) before.push_back(contents(name));
+        for (const auto& name : outputs) std::filesystem::remove(folder.path() / name);
+        works({"task", "check", "job.xml"});
+        works({"run", "job.xml"});
+        for (size_t i = 0; i < outputs.size(); ++i)
+            EXPECT_TRUE(contents(outputs[i]) == before[i]) << outputs[i] << testing::PrintToString(job);
+        fails(4, {"run", "job.xml"}, {"exists", "-y"});
+    }
+};
+
+const Words kCard = {"testgen:size=64x64,rate=25,duration=0.4"};
+
+TEST_F(Task, ARunWritesTheSameBytes) {
+    expectSameBytes({"in.wav", "-o", "cut.wav", "--from", "0.1", "--samplerate", "11025"}, {"cut.wav"});
+    expectSameBytes({"in.wav", "-o", "parts.wav", "--split-channels"}, {"parts#00.wav", "parts#01.wav"});
+    expectSameBytes(kCard + Words{"-o", "card.yuv", "--pixel", "I420", "--timecode", "--fade", "2f",
+                                  "--subtitles", "talk.srt", "--filter", "rawdump:filename=dump"},
+                    {"card.yuv", "card.wav", "dump"});
+    expectSameBytes(kCard + Words{"-o", "card.avi", "--size", "96x80"}, {"card.avi"});
+    Words pictures{"pic.wav"};
+    for (int i = 0; i < 10; ++i) pictures.push_back("pic#" + std::to_string(i) + ".png");
+    expectSameBytes(kCard + Words{"-o", "pic.png"}, pictures);
+}
+
+TEST_F(Task, OutputsGoElsewhere) {
+    works({"transcode", "in.wav", "-o", "out.wav", "--save-task", "job.xml"});
+    works({"run", "job.xml", "-o", "other.wav"});
+    EXPECT_EQ(contents("other.wav"), contents("out.wav"));
+    EXPECT_EQ(works({"run", "job.xml", "-o", "-"}).out.substr(80), contents("out.wav").substr(80));
+    works({"transcode", "in.wav", "-o", "out.wav", "-y", "--save-task", "split.xml", "--split-channels"});
+    fails(2, {"run", "split.xml", "-o", "-"}, {"'-'"});
+    works(Words{"transcode"} + kCard + Words{"-o", "card.yuv", "--pixel", "I420", "--save-task", "two.xml"});
+    fails(2, {"run", "two.xml", "-o", "-"}, {"'-'", "the task makes 2"});
+    works(Words{"transcode"} + kCard + Words{"-o", "pic.png", "--save-task", "pic.xml"});
+    works({"run", "pic.xml", "-o", "n%03d.png"});
+    EXPECT_EQ(contents("n009.png"), contents("pic#9.png"));
+    fails(4, {"run", "job.xml", "-o", "in.wav", "-y"}, {"'in.wav'", "input"});
+    fails(4, {"run", "job.xml", "-o", "job.xml", "-y"}, {"'job.xml'", "input"});
+    EXPECT_THAT(works({"run", "job.xml", "-o", "plan.wav", "--dry-run"}).out,
+                HasSubstr("expect  4000 samples"));
+    EXPECT_EQ(size("plan.wav"), -1);
+}
+
+TEST_F(Task, NamesCountFromTheFolderOfTheTask) {
+    makeFolder("sub");
+    works({"transcode", "in.wav", "-o", "sub/out.wav", "--save-task", "sub/job.xml", "--relative"});
+    EXPECT_THAT(contents("sub/job.xml"), HasSubstr("<str>../in.wav</str>"));
+    EXPECT_THAT(contents("sub/job.xml"), Not(HasSubstr(folder.path().string())));
+    const std::string written = contents("sub/out.wav");
+    std::filesystem::rename(folder.path() / "sub", folder.path() / "moved");
+    works({"run", "moved/job.xml", "-y"});
+    EXPECT_EQ(contents("moved/out.wav"), written);
+
+    std::filesystem::rename(folder.path() / "in.wav", folder.path() / "renamed.wav");
+    fails(3, {"task", "check", "moved/job.xml"}, {"in.wav'", "no such file"});
+    fails(3, {"run", "moved/job.xml", "-y"}, {"in.wav'", "no such file"});
+    EXPECT_THAT(works({"task", "relink", "in.wav=renamed.wav", "moved/job.xml"}).err,
+                HasSubstr("1 name changed"));
+    EXPECT_THAT(contents("moved/job.xml"), HasSubstr("<str>../renamed.wav</str>"));
+    works({"run", "moved/job.xml", "-y"});
+    EXPECT_EQ(contents("moved/out.wav"), written);
+
+    const std::string before = contents("moved/job.xml");
+    fails(2, {"task", "relink", "no.wav=x", "moved/job.xml"}, {"'no.wav'"});
+    for (const char* rule : {"x", "=x", "x="})
+        fails(2, {"task", "relink", rule, "moved/job.xml"}, {"relink", rule, "OLD=NEW"});
+    EXPECT_EQ(contents("moved/job.xml"), before);
+}
+
+TEST_F(Task, AFolderIsRelinkedWithAllThatIsInIt) {
+    makeFolder("a");
+    makeFolder("b");
+    for (const char* name : {"talk.srt", "in.wav"})
+        std::filesystem::copy(folder.path() / name, folder.path() / "b" / name);
+    std::filesystem::rename(folder.path() / "talk.srt", folder.path() / "a" / "talk.srt");
+    works(Words{"transcode"} + kCard +
+          Words{"a/../in.wav", "-o", "a/card.yuv", "--pixel", "I420", "--subtitles", "a/talk.srt",
+                "--save-task", "job.xml", "--no-audio"});
+    const std::string written = contents("a/card.yuv");
+    works({"task", "relink", "a=b", "job.xml"});
+    const std::string shown = works({"task", "show", "job.xml"}).out;
+    EXPECT_THAT(shown, HasSubstr("/b/talk.srt'"));
+    EXPECT_THAT(shown, HasSubstr("/b/card.yuv'"));
+    works({"run", "job.xml"});
+    EXPECT_EQ(contents("b/card.yuv"), written);
+}
+
+TEST_F(Task, ACommandRunsOnlyWhenItIsAllowed) {
+    works(
+        {"transcode", "in.wav", "-o", "out.wav", "--save-task", "job.xml", "--post", "echo %o %i > posted"});
+    std::filesystem::remove(folder.path() / "posted");
+    const Outcome left = works({"run", "job.xml", "-y"});
+    EXPECT_THAT(left.err, HasSubstr("'echo %o %i > posted' is left out; --allow-post runs it"));
+    EXPECT_EQ(size("posted"), -1);
+    EXPECT_THAT(works({"task", "show", "job.xml"}).out, HasSubstr("post     'echo %o %i > posted'"));
+    works({"run", "job.xml", "-y", "--allow-post"});
+    EXPECT_EQ(contents("posted"),
+              (folder.path() / "out.wav").string() + " " + (folder.path() / "in.wav").string() + "\n");
+}
+
+TEST_F(Task, DamagedTasksAreRefusedByName) {
+    works({"transcode", "in.wav", "-o", "out.wav", "--save-task", "job.xml"});
+    std::string task = contents("job.xml");
+    folder.write("cut.xml", task.substr(0, 500));
+    folder.write("empty.xml", "");
+    std::string none = task;
+    none.replace(none.find("rawaenc"), 7, "nowhere");
+    folder.write("none.xml", none);
+    for (const Words& command : {Words{"run"}, Words{"task", "show"}, Words{"task", "check"}}) {
+        fails(3, command + Words{"cut.xml"}, {"'cut.xml' is no sound task"});
+        fails(3, command + Words{"empty.xml"}, {"'empty.xml'"});
+        fails(3, command + Words{"none.xml"}, {"'none.xml' is no sound task", "nowhere"});
+        fails(3, command + Words{"absent.xml"}, {"'absent.xml'", "no such file"});
+        fails(3, command + Words{"in.wav"}, {"'in.wav' is no sound task"});
+    }
+    fails(2, {"task", "shwo", "job.xml"}, {"'shwo'", "did you mean 'show'?"});
+    fails(2, {"task", "show", "job.xml", "job.xml"}, {"one task file"});
+}
+
+}  // namespace
