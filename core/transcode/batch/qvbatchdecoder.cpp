@@ -2,52 +2,19 @@
 
 #include <algorithm>
 #include <cstring>
-#include <limits>
-#include <string>
-#include <vector>
 
 #include "core/arch/qvassert.h"
 #include "core/engine/log/qvlog.h"
 #include "core/engine/status.h"
 #include "core/media/qvbuffer.h"
-#include "core/transcode/batch/framewindow_p.h"
-#include "core/transcode/batch/segmentaudio_p.h"
-#include "core/transcode/batch/segmentvideo_p.h"
+#include "core/transcode/batch/joinedsegments_p.h"
 #include "core/transcode/batch/streamdescription_p.h"
 
+using qvlist::at;
+using qvlist::inRange;
+using qvlist::sizeOf;
+
 namespace {
-
-struct Segment {
-    std::vector<std::unique_ptr<SegmentVideo>> videos;  // in the order of the output's
-    std::vector<std::unique_ptr<SegmentAudio>> audios;
-    MediaTime sound;  // how long its shortest sound is, since open
-};
-
-struct SoundOutput {
-    QvPcm buffer;
-    int segment = 0;  // that it reads
-};
-
-template <class T>
-bool inRange(int index, const std::vector<T>& list) {
-    return index >= 0 && static_cast<std::size_t>(index) < list.size();
-}
-
-template <class T>
-auto& at(T& list, int index) {
-    return list[static_cast<std::size_t>(index)];
-}
-
-template <class T>
-int sizeOf(const std::vector<T>& list) {
-    return static_cast<int>(list.size());
-}
-
-const QvIStream* inputOf(const Segment& segment, int type, int stream) {
-    if (type == qvVideoStream && inRange(stream, segment.videos)) return &at(segment.videos, stream)->input();
-    if (type == qvAudioStream && inRange(stream, segment.audios)) return &at(segment.audios, stream)->input();
-    return nullptr;
-}
 
 bool hasPoints(const ProcessParams& params) {
     const auto points = params.inOutPoints();
@@ -73,39 +40,7 @@ constexpr const char* ignoredNames[] = {"FOURCC", "fastAccess", "subpicMode", "s
 
 }  // namespace
 
-struct QvBatchDecoder::Private {
-    std::vector<Segment> segments;
-    std::vector<VideoJobDescription> videoJobs;
-    std::vector<AudioJobDescription> audioJobs;
-    AnyVector smartStreams;
-    std::vector<FrameWindow> frames;  // one a video stream, as the next two since open
-    std::vector<SoundOutput> sounds;
-    std::vector<int> totalFrames;
-    std::vector<long long> totalSamples;
-    int current = 0;
-    std::string why;  // of the failure at hand
-
-    bool videoLeads() const;
-    bool isSmart(int video) const { return smartStreams.contains(Any(video)); }
-    int frameTotal(int stream) const;
-    long long sampleTotal(int stream) const;
-    int prepare();
-    void makeOutputs();
-    int startVideo(int segment, int stream);
-    int startAudio(int segment, int stream);
-    int startSegment();
-    int stopSegment(int segment);
-    void logCounts(int segment) const;
-    void logStart() const;
-    int nextSegment();
-    int nextSound(int stream);
-    long long owed(const Segment& segment, int stream) const;
-    int fill(SegmentAudio& audio, int n, QvPcm& buffer, int segment);
-    int readLedSound(int n, int stream);
-    int readLeadingSound(int n, int stream);
-    bool smartParams(const Pair& address, AnyDict& out) const;
-    int restart(int stream, bool video);
-};
+struct QvBatchDecoder::Private : JoinedSegments {};
 
 QvBatchDecoder::QvBatchDecoder() : p_(std::make_unique<Private>()) {}
 
@@ -157,7 +92,7 @@ int QvBatchDecoder::insertSegment(const InputSegment& segment, int position) {
     if (pointed)
         qv_dbg()->info("[BatchDecoder] Segment in point=%f, out point =%f", points.inPoint().seconds(),
                        points.outPoint().seconds());
-    Segment made;
+    BatchSegment made;
     int number = 0;
     for (const QvIStream* given : segment.streams) {
         qv_dbg()->info("[BatchDecoder]Segment %d stream %d: %s", index, number++, typeName(given->type));
@@ -213,7 +148,7 @@ void QvBatchDecoder::getParam(const char* name, Any& value) const {
         const auto says = [](const auto& stream) {
             return stream->input().decoder->getParam("notSeekable").isTrue();
         };
-        value = std::any_of(p_->segments.begin(), p_->segments.end(), [&](const Segment& segment) {
+        value = std::any_of(p_->segments.begin(), p_->segments.end(), [&](const BatchSegment& segment) {
             return std::any_of(segment.videos.begin(), segment.videos.end(), says) ||
                    std::any_of(segment.audios.begin(), segment.audios.end(), says);
         });
@@ -226,36 +161,6 @@ void QvBatchDecoder::getParam(const char* name, Any& value) const {
     } else {
         QvDecodePipe::getParam(name, value);
     }
-}
-
-// What an encoder needs to take over coded frames; false unless every segment can give it. A conversion would
-// be passed by.
-bool QvBatchDecoder::Private::smartParams(const Pair& address, AnyDict& out) const {
-    const auto [type, stream] = address;
-    AnyVector parts;
-    Any name;
-    for (const Segment& segment : segments) {
-        const QvIStream* from = inputOf(segment, type, stream);
-        if (!from) return false;
-        const QvIStream& input = *from;
-        const bool video = type == qvVideoStream;
-        if (video && at(segment.videos, stream)->converts()) return false;
-        const SegmentSpan span = video
-                                     ? at(segment.videos, stream)->span(at(videoJobs, stream).outFramerate)
-                                     : at(segment.audios, stream)->span(at(audioJobs, stream).outSamplerate);
-        Any answer = Pair(type, input.number);
-        input.decoder->getParam("srParams", answer);
-        if (!answer.isDict() || answer.asDict().empty()) return false;
-        AnyDict part = answer.asDict();
-        if (!name.isValid())
-            name = part.get("decoder_name").isText() ? part.get("decoder_name") : Any(input.decoder->name());
-        part.set("frame0", Any(span.first));
-        part.set("nrFrames", Any(span.count));
-        parts.append(part);
-    }
-    if (parts.empty()) return false;
-    out = AnyDict("join_decoder", 1, "decoder_name", name, "segments", parts);
-    return true;
 }
 
 int QvBatchDecoder::nrStreams(int type) const {
@@ -278,22 +183,6 @@ void QvBatchDecoder::getStreamParams(int type, int stream, AnyDict& params) cons
         qvDescribeAudio(at(p_->audioJobs, stream), nrSamples(stream), params);
 }
 
-int QvBatchDecoder::Private::frameTotal(int stream) const {
-    long long total = 0;
-    for (const Segment& segment : segments)
-        if (inRange(stream, segment.videos))
-            total += at(segment.videos, stream)->span(at(videoJobs, stream).outFramerate).owed;
-    return static_cast<int>(std::min<long long>(total, std::numeric_limits<int>::max()));
-}
-
-long long QvBatchDecoder::Private::sampleTotal(int stream) const {
-    long long total = 0;
-    for (const Segment& segment : segments)
-        if (inRange(stream, segment.audios))
-            total += at(segment.audios, stream)->span(at(audioJobs, stream).outSamplerate).owed;
-    return total;
-}
-
 int QvBatchDecoder::nrFrames(int stream) const {
     if (inRange(stream, p_->totalFrames)) return at(p_->totalFrames, stream);
     return inRange(stream, p_->videoJobs) ? p_->frameTotal(stream) : 0;
@@ -314,8 +203,8 @@ bool QvBatchDecoder::isSelected(int, int) const { return true; }
 
 int QvBatchDecoder::setReadUserData(int type, int stream, bool on) {
     int result = QvStatus::failed;
-    for (const Segment& segment : p_->segments) {
-        const QvIStream* input = inputOf(segment, type, stream);
+    for (const BatchSegment& segment : p_->segments) {
+        const QvIStream* input = segment.input(type, stream);
         if (input && input->decoder->setReadUserData(type, input->number, on) == QvStatus::ok)
             result = QvStatus::ok;
     }
@@ -323,8 +212,8 @@ int QvBatchDecoder::setReadUserData(int type, int stream, bool on) {
 }
 
 bool QvBatchDecoder::readUserData(int type, int stream) const {
-    return std::any_of(p_->segments.begin(), p_->segments.end(), [&](const Segment& segment) {
-        const QvIStream* input = inputOf(segment, type, stream);
+    return std::any_of(p_->segments.begin(), p_->segments.end(), [&](const BatchSegment& segment) {
+        const QvIStream* input = segment.input(type, stream);
         return input && input->decoder->readUserData(type, input->number);
     });
 }
@@ -349,155 +238,12 @@ int QvBatchDecoder::open() {
     return QvStatus::ok;
 }
 
-// Each conversion is built once to see that it can be, and again when its segment begins.
-int QvBatchDecoder::Private::prepare() {
-    why.clear();
-    const Segment* before = nullptr;
-    for (int i = 0; i < sizeOf(segments); ++i) {
-        Segment& segment = at(segments, i);
-        qv_dbg()->info("[BatchDecoder] Opening segment %d", i);
-        if (segment.videos.size() != videoJobs.size() || segment.audios.size() != audioJobs.size()) {
-            why = "The streams of a segment are not those of the output.";
-            return QvStatus::invalidStructure;
-        }
-        for (int k = 0; k < sizeOf(videoJobs); ++k) {
-            qv_dbg()->info("[BatchDecoder] Opening segment video stream %d", k);
-            const SegmentVideo* like = before ? at(before->videos, k).get() : nullptr;
-            if (const int result = at(segment.videos, k)->prepare(at(videoJobs, k), like, why)) return result;
-        }
-        for (int k = 0; k < sizeOf(audioJobs); ++k) {
-            qv_dbg()->info("[BatchDecoder] Opening segment audio stream %d", k);
-            const SegmentAudio* like = before ? at(before->audios, k).get() : nullptr;
-            if (const int result = at(segment.audios, k)->prepare(at(audioJobs, k), like, why)) return result;
-            const MediaTime length = at(segment.audios, k)->span().duration();
-            segment.sound = k == 0 ? length : std::min(segment.sound, length);
-        }
-        before = &segment;
-    }
-    return QvStatus::ok;
-}
-
-void QvBatchDecoder::Private::makeOutputs() {
-    frames = std::vector<FrameWindow>(videoJobs.size());
-    sounds = std::vector<SoundOutput>(audioJobs.size());
-    totalFrames.clear();
-    totalSamples.clear();
-    for (int i = 0; i < sizeOf(videoJobs); ++i) totalFrames.push_back(frameTotal(i));
-    for (int i = 0; i < sizeOf(audioJobs); ++i) {
-        const AudioJobDescription& job = at(audioJobs, i);
-        totalSamples.push_back(sampleTotal(i));
-        at(sounds, i).buffer.init(job.outSamplerate, job.outChannels, (job.outBitsPerSample + 7) / 8,
-                                  job.outSamplerate);
-    }
-    current = 0;
-}
-
 int QvBatchDecoder::close() {
     if (getState() != stateOpen) return QvStatus::ok;
-    int result = QvStatus::ok;
-    if (p_->current < sizeOf(p_->segments)) p_->logCounts(p_->current);
-    for (int i = 0; i < sizeOf(p_->segments); ++i) {
-        const int stopped = p_->stopSegment(i);
-        if (stopped != QvStatus::ok && result == QvStatus::ok) setError(stopped, "%s", p_->why.c_str());
-        result |= stopped;
-    }
-    p_->frames.clear();
-    p_->sounds.clear();
-    p_->totalFrames.clear();
-    p_->totalSamples.clear();
-    p_->smartStreams.clear();
-    p_->current = 0;
+    const int result = p_->stop();
+    if (result != QvStatus::ok) setError(result, "%s", p_->why.c_str());
     QvDecodePipe::close();
     return result;
-}
-
-// --- From segment to segment.
-
-// Whether frames are read that say where a segment ends.
-bool QvBatchDecoder::Private::videoLeads() const {
-    for (int i = 0; i < sizeOf(videoJobs); ++i)
-        if (!isSmart(i)) return true;
-    return false;
-}
-
-int QvBatchDecoder::Private::startVideo(int segment, int stream) {
-    return at(at(segments, segment).videos, stream)->start(why);
-}
-
-// Sound that lasts as long as the picture is there for the last fraction of a frame, too, so it has no end of
-// its own; sound that the job cuts earlier has.
-int QvBatchDecoder::Private::startAudio(int segment, int stream) {
-    Segment& of = at(segments, segment);
-    SegmentAudio& audio = *at(of.audios, stream);
-    bool bounded = !videoLeads();
-    for (int i = 0; i < sizeOf(of.videos) && !bounded; ++i)
-        bounded = !isSmart(i) && audio.span().duration() < at(of.videos, i)->span().duration();
-    return audio.start(bounded, why);
-}
-
-int QvBatchDecoder::Private::startSegment() {
-    for (int i = 0; i < sizeOf(videoJobs); ++i)
-        if (!isSmart(i))
-            if (const int result = startVideo(current, i)) return result;
-    for (int i = 0; i < sizeOf(audioJobs); ++i) {
-        if (const int result = startAudio(current, i)) return result;
-        at(sounds, i).segment = current;
-    }
-    return QvStatus::ok;
-}
-
-int QvBatchDecoder::Private::stopSegment(int segment) {
-    int result = QvStatus::ok;
-    const auto note = [&result](int stopped) {
-        if (result == QvStatus::ok) result = stopped;
-    };
-    for (const auto& video : at(segments, segment).videos) note(video->stop(why));
-    for (const auto& audio : at(segments, segment).audios) note(audio->stop(why));
-    return result;
-}
-
-void QvBatchDecoder::Private::logCounts(int segment) const {
-    const Segment& of = at(segments, segment);
-    for (int i = 0; i < sizeOf(of.videos); ++i)
-        if (!isSmart(i))
-            qv_dbg()->info("[BatchDecoder]Segment %d, stream %d, frames read=%d", segment, i,
-                           at(of.videos, i)->framesRead());
-    for (int i = 0; i < sizeOf(of.audios); ++i)
-        qv_dbg()->info("[BatchDecoder]Segment %d, stream %d, samples read=%lld", segment, i,
-                       at(of.audios, i)->samplesRead());
-}
-
-void QvBatchDecoder::Private::logStart() const {
-    if (current >= sizeOf(segments))
-        qv_dbg()->debug("[BatchDecoder] Last segment EOS");
-    else
-        qv_dbg()->info("[BatchDecoder] Starting new segment %d", current);
-}
-
-// The last segment stays as it is, for its last frame is still in use.
-int QvBatchDecoder::Private::nextSegment() {
-    QV_ASSERT_MSG(current >= 0 && current < sizeOf(segments), "[BatchDecoder] _currentSegment out of range");
-    logCounts(current);
-    ++current;
-    logStart();
-    if (current >= sizeOf(segments)) return QvStatus::ok;
-    for (FrameWindow& frame : frames) frame.forget();
-    const int stopped = stopSegment(current - 1);
-    const int started = startSegment();
-    return stopped != QvStatus::ok ? stopped : started;
-}
-
-// Where sound leads, each stream goes to the next segment by itself.
-int QvBatchDecoder::Private::nextSound(int stream) {
-    int& segment = at(sounds, stream).segment;
-    const int stopped = at(at(segments, segment).audios, stream)->stop(why);
-    if (++segment > current) {
-        logCounts(current);
-        current = segment;
-        logStart();
-    }
-    const int started = segment < sizeOf(segments) ? startAudio(segment, stream) : QvStatus::ok;
-    return stopped != QvStatus::ok ? stopped : started;
 }
 
 // --- Reading.
@@ -505,105 +251,23 @@ int QvBatchDecoder::Private::nextSound(int stream) {
 int QvBatchDecoder::readFrame(int stream) {
     if (getState() != stateOpen || !inRange(stream, p_->frames))
         return setError(QvStatus::illegalState, "readFrame: no open video stream %d", stream);
-    while (p_->current < sizeOf(p_->segments)) {
-        QvFrame* frame = nullptr;
-        int result = at(at(p_->segments, p_->current).videos, stream)->read(frame, p_->why);
-        if (result == QvStatus::ok) {
-            result = at(p_->frames, stream).show(*frame);
-            return result == QvStatus::ok ? result : setError(result, "No frame to show.");
-        }
-        if (result == QvStatus::endOfStream) result = p_->nextSegment();
-        if (result != QvStatus::ok) return setError(result, "%s", p_->why.c_str());
-    }
-    return QvStatus::endOfStream;
+    const int result = p_->readFrame(stream);
+    if (result == QvStatus::ok || result == QvStatus::endOfStream) return result;
+    return setError(result, "%s", p_->why.c_str());
 }
 
 int QvBatchDecoder::readSamples(int count, int stream) {
     if (getState() != stateOpen || !inRange(stream, p_->sounds))
         return setError(QvStatus::illegalState, "readSamples: no open audio stream %d", stream);
-    QvPcm& buffer = at(p_->sounds, stream).buffer;
-    buffer.setSamples(0);
-    const int result =
-        p_->videoLeads() ? p_->readLedSound(count, stream) : p_->readLeadingSound(count, stream);
-    if (result == QvStatus::endOfStream) return result;
-    if (result != QvStatus::ok) return setError(result, "%s", p_->why.c_str());
-    buffer.setPosition(buffer.position() + buffer.samples());
-    return buffer.samples();
-}
-
-// Brings the buffer to n samples more; what the segment does not have is silence.
-int QvBatchDecoder::Private::fill(SegmentAudio& audio, int n, QvPcm& buffer, int segment) {
-    const int before = buffer.samples();
-    if (!audio.ended())
-        if (const int result = audio.read(n, buffer, why)) return result;
-    const int missing = n - (buffer.samples() - before);
-    audio.count(n);
-    if (missing < 1) return QvStatus::ok;
-    qv_dbg()->debug("Inserting silence at the end of %d segment, %d samples", segment, missing);
-    audio.end();
-    return buffer.addSilence(missing);
-}
-
-// Video says when a segment ends; until then there are as many samples as are asked for.
-int QvBatchDecoder::Private::readLedSound(int n, int stream) {
-    if (current >= sizeOf(segments)) return QvStatus::endOfStream;
-    return fill(*at(at(segments, current).audios, stream), n, at(sounds, stream).buffer, current);
-}
-
-// Samples that a segment gives to a stream where sound leads: all streams end with the shortest.
-long long QvBatchDecoder::Private::owed(const Segment& segment, int stream) const {
-    const SegmentSpan& span = at(segment.audios, stream)->span();
-    if (span.duration() <= segment.sound) return span.owed;
-    return std::min(span.owed, segment.sound.position(at(audioJobs, stream).outSamplerate));
-}
-
-int QvBatchDecoder::Private::readLeadingSound(int n, int stream) {
-    SoundOutput& sound = at(sounds, stream);
-    while (sound.buffer.samples() < n && sound.segment < sizeOf(segments)) {
-        const Segment& segment = at(segments, sound.segment);
-        SegmentAudio& audio = *at(segment.audios, stream);
-        const long long left = owed(segment, stream) - audio.samplesRead();
-        int result = QvStatus::ok;
-        if (left < 1 || audio.ended())
-            result = nextSound(stream);
-        else
-            result = fill(audio, static_cast<int>(std::min<long long>(left, n - sound.buffer.samples())),
-                          sound.buffer, sound.segment);
-        if (result != QvStatus::ok) return result;
-    }
-    return sound.buffer.samples() > 0 ? QvStatus::ok : QvStatus::endOfStream;
-}
-
-QvFrame* QvBatchDecoder::getFramePtr(int stream) {
-    return inRange(stream, p_->frames) ? &at(p_->frames, stream).frame() : nullptr;
-}
-
-QvPcm* QvBatchDecoder::getAudioPtr(int stream) {
-    return inRange(stream, p_->sounds) ? &at(p_->sounds, stream).buffer : nullptr;
-}
-
-// --- Back to the start.
-
-// Each stream goes back by itself; the later segments begin anew when their turn comes.
-int QvBatchDecoder::Private::restart(int stream, bool video) {
-    for (int i = 1; i < sizeOf(segments); ++i) {
-        Segment& segment = at(segments, i);
-        if (video)
-            at(segment.videos, stream)->stop(why);
-        else
-            at(segment.audios, stream)->stop(why);
-    }
-    current = 0;
-    if (segments.empty()) return QvStatus::ok;
-    return video ? startVideo(0, stream) : startAudio(0, stream);
+    const int result = p_->readSamples(count, stream);
+    if (result >= 0 || result == QvStatus::endOfStream) return result;
+    return setError(result, "%s", p_->why.c_str());
 }
 
 int QvBatchDecoder::seekToFrame(long long frame, int stream) {
     QV_ASSERT(frame == 0);
     if (getState() != stateOpen || !inRange(stream, p_->frames))
         return setError(QvStatus::illegalState, "seekToFrame: no open video stream %d", stream);
-    at(p_->frames, stream).forget();
-    at(p_->frames, stream).restart();
     const int result = p_->restart(stream, true);
     return result == QvStatus::ok ? result : setError(result, "%s", p_->why.c_str());
 }
@@ -612,10 +276,14 @@ int QvBatchDecoder::seekToSample(long long sample, int stream) {
     QV_ASSERT(sample == 0);
     if (getState() != stateOpen || !inRange(stream, p_->sounds))
         return setError(QvStatus::illegalState, "seekToSample: no open audio stream %d", stream);
-    SoundOutput& sound = at(p_->sounds, stream);
-    sound.buffer.setSamples(0);
-    sound.buffer.setPosition(-1);
-    sound.segment = 0;
     const int result = p_->restart(stream, false);
     return result == QvStatus::ok ? result : setError(result, "%s", p_->why.c_str());
+}
+
+QvFrame* QvBatchDecoder::getFramePtr(int stream) {
+    return inRange(stream, p_->frames) ? &at(p_->frames, stream).frame() : nullptr;
+}
+
+QvPcm* QvBatchDecoder::getAudioPtr(int stream) {
+    return inRange(stream, p_->sounds) ? &at(p_->sounds, stream).buffer : nullptr;
 }
