@@ -65,6 +65,8 @@ class QV_API QvBatchDecoder : public QvDecodePipe {
     int deselect(int type, int stream) override;
     int selected(AnyDict& dict) const override;  // an assertion
     bool isSelected(int type, int stream) const override;
+    int setReadUserData(int type, int stream, bool on) override;  // of every segment that can
+    bool readUserData(int type, int stream) const override;       // of any segment
 
   private:
     struct Private;

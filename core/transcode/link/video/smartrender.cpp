@@ -53,7 +53,8 @@ void SmartRender::negotiate(QvDecodePipe& decoder, int decStream, QvEncodePipe& 
     if (possible.isDict() || !possible.isTrue()) return;
     video->setParam("smartRender", 1);
     video->setParam("decoderStruct", source);
-    decoder.setParam("smartRenderingOn", Pair(qvVideoStream, decStream));
+    // A decoder that is several others takes note of it and refuses the name.
+    qvSetOptionalParam(decoder, "smartRenderingOn", Pair(qvVideoStream, decStream));
 }
 
 bool SmartRender::isOn(const QvEncodePipe& encoder) {

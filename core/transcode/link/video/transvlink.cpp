@@ -20,6 +20,7 @@
 #include "core/transcode/link/video/qualitylog_p.h"
 #include "core/transcode/link/video/smartrender_p.h"
 #include "core/transcode/link/video/streamicon_p.h"
+#include "core/transcode/link/video/totalframes_p.h"
 
 namespace {
 
@@ -169,24 +170,8 @@ int TransVLink::buildPipe() {
     return QvStatus::ok;
 }
 
-// Filters that fade or count need to know how many frames they will see.
 void TransVLink::_setTotalVDuration() {
-    if (!videoPipe_) return;
-    const auto factor = [&](int i) {
-        return std::max(1, videoPipe_->filter(i)->getParam("_rateFactor").asInt32(1));
-    };
-    const int filters = videoPipe_->nrFilters();
-    long long total = range_->in, later = 1;  // `later`: frames that the filters to come make of one
-    for (int i = 0; i < filters; ++i) later *= factor(i);
-    for (int i = 0; i < filters; ++i) {
-        auto& filter = *videoPipe_->filter(i);
-        if (filter.getParam("_isFramerateConverter").isTrue())
-            total = range_->out / later;
-        else
-            qvSetOptionalParam(filter, "_totalFrames", static_cast<int>(total));
-        total *= factor(i);
-        later /= factor(i);
-    }
+    if (videoPipe_) qvSetTotalFrames(*videoPipe_, range_->in, range_->out);
 }
 
 void TransVLink::prepareMetaSources() {
