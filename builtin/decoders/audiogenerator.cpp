@@ -37,9 +37,23 @@ void SoundLoop::copy(unsigned char* to, int count) {
     }
 }
 
+// Of silence. Samples of one byte have none that is 0 in all formats.
+int AudioGenerator::takeFormat(const AnyDict& dict, QvPcmFormat& format) {
+    constexpr int mostRate = 768000, mostChannels = 64;
+    format.samplerate = dict.getInt32("samplerate", format.samplerate);
+    format.channels = dict.getInt32("channels", format.channels);
+    format.bitsPerSample = dict.getInt32("bitsPerSample", format.bitsPerSample);
+    const bool known = format.samplerate >= 1 && format.samplerate <= mostRate && format.channels >= 1 &&
+                       format.channels <= mostChannels &&
+                       (format.bitsPerSample == 16 || format.bitsPerSample == 24 || format.bitsPerSample == 32);
+    return known ? QvStatus::ok : QvStatus::invalidStructure;
+}
+
 int AudioGenerator::init(const AnyDict& dict) {
     QvPcmFormat format;
     QvSoundBytes::getInfo(0, nullptr, &format);
+    const bool silent = dict["content"] == "silence";
+    if (silent && takeFormat(dict, format) != QvStatus::ok) return QvStatus::invalidStructure;
     samplerate_ = format.samplerate;
     channels_ = format.channels;
     const int bytesPerSample = (format.bitsPerSample + 7) / 8;
@@ -51,7 +65,11 @@ int AudioGenerator::init(const AnyDict& dict) {
     params.set("bytesPerSample", Any(bytesPerSample));
     countSamples();
 
-    const std::unique_ptr<const QvPcm> sound(QvSoundBytes::create(0));
+    std::unique_ptr<QvPcm> sound(silent ? new QvPcm : QvSoundBytes::create(0));
+    // Of a sound without samples the loop is silence.
+    if (silent)
+        if (const int result = sound->init(1, channels_, bytesPerSample, samplerate_); result != QvStatus::ok)
+            return result;
     const int length = static_cast<int>(std::min<long long>(samples_, samplerate_));
     if (!sound) return QvStatus::failed;
     if (const int result = loop_.init(*sound, length, samples_); result != QvStatus::ok) return result;

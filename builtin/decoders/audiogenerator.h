@@ -1,4 +1,5 @@
-// An audio stream of the test generator: a beep each second, 16-bit stereo at 44100 Hz.
+// An audio stream of the test generator: a beep each second, 16-bit stereo at 44100 Hz, or silence in the
+// format that the description asks for.
 #pragma once
 
 #include "builtin/decoders/generatorstream.h"
@@ -44,4 +45,5 @@ class AudioGenerator : public GeneratorStream {
     int channels_ = 0;
 
     void countSamples();
+    int takeFormat(const AnyDict& dict, QvPcmFormat& format);
 };

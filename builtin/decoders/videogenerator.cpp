@@ -29,7 +29,8 @@ void copyPixels(const QvFrame& from, QvFrame& to) {
 int VideoGenerator::init(const AnyDict& dict) {
     findTestFont();
     takeFramerate(dict["framerate"]);
-    if (!dict["picture"].isValid()) {
+    black_ = dict["content"] == "black";
+    if (black_ || !dict["picture"].isValid()) {
         if (const int result = addPlain(dict); result != QvStatus::ok) return result;
     } else {
         addPictures(dict);
@@ -72,12 +73,12 @@ void VideoGenerator::takeFramerate(const Any& value) {
 int VideoGenerator::addPlain(const AnyDict& dict) {
     const int width = dict.getInt32("width", 0);
     const int height = dict.getInt32("height", 0);
-    QV_ASSERT_MSG(width >= smallest || height >= smallest,
+    QV_ASSERT_MSG(black_ || width >= smallest || height >= smallest,
                   "testgen: No picture and invalid dimensions specified");
     auto frame = std::make_unique<QvFrame>();
     if (width < 1 || height < 1) return QvStatus::invalidStructure;
     if (const int result = frame->init(QvFourcc::BGR4, width, height); result != QvStatus::ok) return result;
-    frame->setRGB(128, 128, 128);
+    black_ ? frame->setRGB(0, 0, 0) : frame->setRGB(128, 128, 128);
     pictures_.push_back(std::move(frame));
     return QvStatus::ok;
 }
@@ -148,6 +149,7 @@ void VideoGenerator::makeViews(int count) {
 void VideoGenerator::drawCard() {
     QvFrame& picture = *pictures_.front();
     picture.framerate = framerate_;
+    if (black_) return;
     if (isGrayBar())
         drawGrayCard(picture);
     else
@@ -162,7 +164,7 @@ void VideoGenerator::showCard() {
 }
 
 void VideoGenerator::drawMoving() {
-    if (isGrayBar()) return;
+    if (black_ || isGrayBar()) return;
     int nr = 0;
     for (auto& view : views_) drawMovingParts(*view, ++nr, text_.get());
 }

@@ -39,6 +39,8 @@ class VideoGenerator : public GeneratorStream {
     Any mode_;
     Frames views_;  // a chain
 
+    bool black_ = false;
+
     bool isGrayBar() const { return mode_ == "graybar"; }
     void takeFramerate(const Any& value);
     void addPicture(const Any& picture);

@@ -15,8 +15,10 @@
 // The dictionary that describes them, parameter "streams" of the module, has the Vectors "vids" and "auds"
 // with a Dict for each stream. A video stream's: "framerate" (Framerate, or Float frames a second), "picture"
 // or "width" and "height", "frameAspect" (Float, default from the size), "duration" (MediaTime, or Float
-// seconds) or "frames", "nrViews" (1 .. 10, default 1). An audio stream's: "duration" or "samples". The
-// parameter "mode" with "graybar" gives a still picture of gray bars in place of the card.
+// seconds) or "frames", "nrViews" (1 .. 10, default 1). An audio stream's: "duration" or "samples". "content"
+// (String) gives other things than the card and the beep: of video "black", of any size; of sound "silence",
+// then with "samplerate" (1 .. 768000), "channels" (1 .. 64) and "bitsPerSample" (16, 24, 32). The parameter
+// "mode" with "graybar" gives a still picture of gray bars in place of the card.
 #pragma once
 
 #include "core/arch/api.h"

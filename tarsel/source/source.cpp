@@ -113,11 +113,9 @@ void setChecked(QvCodec& codec, const std::string& name, const Any& value, const
     throw failure(Msg::parameterRefused, {what, name, reason.empty() ? "it is not in its range" : reason});
 }
 
-namespace {
-
-bool isGenerator(const std::string& spec) { return spec.rfind(kGenerator, 0) == 0 || spec == "testgen"; }
-
-}  // namespace
+bool Source::isGenerator(const std::string& spec) {
+    return spec.rfind(kGenerator, 0) == 0 || spec == "testgen";
+}
 
 Source::Source(const std::string& spec, const std::string& raw) : name_(spec) {
     if (isGenerator(spec)) {

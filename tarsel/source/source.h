@@ -19,6 +19,7 @@ class Source {
     // Whether an input of this name needs no format from outside: the generator, or an extension with a
     // decoder.
     static bool describesItself(const std::string& spec);
+    static bool isGenerator(const std::string& spec);
 
     QvDecodePipe& decoder() const { return *open_; }
     const std::string& name() const { return name_; }

@@ -29,6 +29,7 @@ constexpr Message kMessages[] = {
     // values of options
     {Msg::timeWrong,        Exit::usage, "{option}", "{name} is not a time",                                  "use SS[.mmm], MM:SS, HH:MM:SS[.mmm], 120f, HH:MM:SS:FF or HH:MM:SS;FF"},
     {Msg::timeCountsFrames, Exit::usage, "{option}", "{name} counts frames, but the input has no frame rate", "give seconds"},
+    {Msg::rangeWrong,        Exit::usage, "{option}",                               "{name} is no part of a time",                           "give FROM-TO, as 10-20, 1:30-2:00, 250f-500f or 10-"},
     {Msg::timeBeforeStart,  Exit::usage, "{option}", "{name} is before the start, as all of it is {text}",    "give a time nearer to the end"},
     {Msg::rateWrong,        Exit::usage, "{option}", "{name} is not a frame rate",                            "use 25, 29.97, 30000/1001, pal, ntsc or film, or 25i and 25b for fields"},
     {Msg::rateOfFields,     Exit::usage, "{option}", "{name} counts fields; 'i' and 'b' follow frames a second", "use {text}"},
@@ -133,6 +134,8 @@ constexpr Message kMessages[] = {
     // filters and modules
     {Msg::filterUnknown,     Exit::module, "--filter",                               "there is no filter {name}",                             "{hint}'tarsel modules' lists all"},
     {Msg::filterNoStream,    Exit::usage,  "--filter {text}",                        "this job has no {text}",                                "leave it out"},
+    {Msg::filterNotDivided,  Exit::usage,  "--filter {text}",                     "it would begin anew in each segment",                          "leave it out, and filter the joined output in a second run"},
+    {Msg::fadeTooLong,       Exit::usage,  "--fade",                              "{text} frames are more than the {text} of its segment",        "give fewer"},
     {Msg::filterChannels,    Exit::usage,  "--filter {text}",                        "the sound has {text} channels, and it works on {text}", "take fewer with --channels"},
     {Msg::effectNoPicture,   Exit::usage,  "{option}",                               "this job has no picture",                               "leave it out"},
     {Msg::filterPlaceTaken,  Exit::usage,  "--filter {text}",                        "its one place in the chain is taken by another option", "leave one out"},

@@ -29,6 +29,7 @@ enum class Msg : unsigned short {
     // values of options
     timeWrong,
     timeCountsFrames,
+    rangeWrong,
     timeBeforeStart,
     rateWrong,
     rateOfFields,
@@ -133,6 +134,8 @@ enum class Msg : unsigned short {
     // filters and modules
     filterUnknown,
     filterNoStream,
+    filterNotDivided,
+    fadeTooLong,
     filterChannels,
     effectNoPicture,
     filterPlaceTaken,

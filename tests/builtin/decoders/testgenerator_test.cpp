@@ -106,6 +106,44 @@ TEST_F(Testgen, BeepsOnceASecondAndEnds) {
     for (const long long bad : {110250LL, -1LL}) EXPECT_THROW(decoder.seekToSample(bad, 0), QvAssertFailure);
 }
 
+TEST_F(Testgen, BlackAndSilenceAreOfAnyFormat) {
+    AnyDict video("content", "black", "width", 6, "height", 4, "frames", 3), sound("content", "silence");
+    video.set("framerate", Any(QvFramerate(QvRatio(25, 1))));
+    sound.set("samples", 100);
+    sound.set("samplerate", 8000);
+    sound.set("channels", 5);
+    sound.set("bitsPerSample", 24);
+    AnyVector vids, auds;
+    vids.append(video);
+    auds.append(sound);
+    decoder.setParam("streams", AnyDict("vids", Any(vids), "auds", Any(auds)));
+    ASSERT_EQ(decoder.open(), 0);
+    for (int i = 0; i < 3; ++i) {
+        ASSERT_EQ(decoder.readFrame(0), 0);
+        const QvFrame& frame = *decoder.getFramePtr(0);
+        EXPECT_EQ(frame.frameNr, i);
+        for (int byte = 0; byte < 6 * 4 * 4; ++byte)
+            EXPECT_TRUE(byte % 4 == 3 || frame.plane(0)[byte] == 0) << byte;
+    }
+    EXPECT_EQ(decoder.nrSamples(0), 100);
+    EXPECT_EQ(decoder.readSamples(1000, 0), 100);
+    const QvPcm& pcm = *decoder.getAudioPtr(0);
+    EXPECT_EQ(pcm.channels(), 5);
+    EXPECT_EQ(pcm.bytesPerSample(), 3);
+    for (int byte = 0; byte < 100 * 15; ++byte) EXPECT_EQ(pcm.ptr(0)[byte], 0) << byte;
+
+    for (const auto& [key, value] : {std::pair{"samplerate", 0}, {"channels", 65}, {"bitsPerSample", 8}}) {
+        decoder.close();
+        AnyDict wrong = sound;
+        wrong.set(key, value);
+        AnyVector wrongs;
+        wrongs.append(wrong);
+        decoder.setParam("streams", AnyDict("auds", Any(wrongs)));
+        decoder.open();
+        EXPECT_EQ(decoder.nrStreams(qvAudioStream), 0) << key;
+    }
+}
+
 TEST_F(Testgen, MissingParametersAssertAndLeaveItClosed) {
     const std::pair<const char*, Any> rows[] = {
         {"framerate", Any()}, {"width", 31}, {"picture", "/no/such/picture.png"}};
