@@ -94,6 +94,7 @@ int run(int argc, char** argv) {
     line.flag("--allow-unsafe-plugins", allowUnsafePlugins, "Load plug-ins that other users may change, too");
     addTranscode(line, signals, version);
     addInfo(line);
+    addLoudness(line);
     addCaptions(line, signals);
     addFrame(line, signals, version);
     addModules(line);

@@ -113,6 +113,13 @@ void setChecked(QvCodec& codec, const std::string& name, const Any& value, const
     throw failure(Msg::parameterRefused, {what, name, reason.empty() ? "it is not in its range" : reason});
 }
 
+AnyDict stateOf(const QvCodec& codec) {
+    AnyDict state;
+    codec.store(state);
+    state.set("_on", 1);
+    return state;
+}
+
 namespace {
 
 bool isGenerator(const std::string& spec) { return spec.rfind(kGenerator, 0) == 0 || spec == "testgen"; }

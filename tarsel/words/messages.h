@@ -8,7 +8,7 @@
 
 #include "tarsel/words/failure.h"
 
-enum class Msg : unsigned char {
+enum class Msg : unsigned short {
     // the command line
     commandMissing,
     commandUnknown,
@@ -81,7 +81,6 @@ enum class Msg : unsigned char {
     frameReadFailed,
     inputNoPicture,
     inputNoSound,
-    inputSoundShort,
     inputNoStreams,
     inputUnwanted,
     fileNoPicture,
@@ -124,6 +123,26 @@ enum class Msg : unsigned char {
     sheetFailed,
     pictureName,
     pictureFailed,
+    // sound
+    mapWrong,
+    mapLong,
+    mapSounds,
+    mapSoundNone,
+    mapChannelNone,
+    volumeSoundNone,
+    channelsMix,
+    soundChannels,
+    effectNoSound,
+    delayLong,
+    delayAll,
+    rateQualityNone,
+    endsNoSound,
+    soundEndsFirst,
+    soundCut,
+    soundFilled,
+    soundClipped,
+    loudnessNoSound,
+    loudnessFailed,
     // filters and modules
     filterUnknown,
     filterNoStream,

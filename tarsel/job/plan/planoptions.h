@@ -7,14 +7,17 @@
 #include <vector>
 
 #include "tarsel/picture/effects.h"
+#include "tarsel/sound/soundoptions.h"
 
 struct PlanOptions {
     std::vector<std::string> inputs;
     std::string output, format, muxer, saveTask;
     std::string from, to, duration;
     EffectOptions effects;
+    SoundOptions sound;
     std::optional<int> samplerate, channels, bits;
     bool noVideo = false, noAudio = false;
+    bool shortest = false, longest = false;
     bool splitChannels = false;
     bool acceptPartial = false;
 };
