@@ -96,6 +96,7 @@ int run(int argc, char** argv) {
     addRun(line, signals, version);
     addTask(line, signals);
     addInfo(line);
+    addLoudness(line);
     addCaptions(line, signals);
     addFrame(line, signals, version);
     addModules(line);

@@ -84,10 +84,12 @@ AudioFilterPtr newChannelConverter(const AudioJobDescription& job) {
     return converter;
 }
 
-AudioFilterPtr newQuantizer(int bits, const std::string& dither = AudioConversion().dither) {
+AudioFilterPtr newQuantizer(int bits, const AudioConversion& conversion = {}) {
     auto quantizer = qvchain::requireAudioFilter("aquant");
     quantizer->setParam("outBitsPerSample", bits);
+    const std::string& dither = conversion.dither;
     if (dither != AudioConversion().dither) setValue(*quantizer, "dither", dither.c_str());
+    if (!conversion.clipWarning) qvSetOptionalParam(*quantizer, "clipWarning", 0);
     return quantizer;
 }
 
@@ -143,6 +145,6 @@ std::unique_ptr<QvAProcessPipe> qvchain::createAudioPipe(const AudioJobDescripti
     append(*pipe, std::move(channels));
     append(*pipe, std::move(rate));
     for (auto& filter : back) append(*pipe, std::move(filter));
-    append(*pipe, newQuantizer(job.outBitsPerSample, job.conversion.dither));
+    append(*pipe, newQuantizer(job.outBitsPerSample, job.conversion));
     return pipe;
 }

@@ -102,6 +102,10 @@ std::optional<AudioConversion> ProcessParams::audioConversion() const {
     return stored.isDict() ? std::optional<AudioConversion>(stored.asDict()) : std::nullopt;
 }
 
+void ProcessParams::setHoldLast(bool on) { set("holdLast", on ? 1 : 0); }
+
+bool ProcessParams::holdLast() const { return getInt32("holdLast", 0) != 0; }
+
 void ProcessParams::setSmartRender(int mode) {
     constexpr int modes = 3;
     const bool known = mode >= 0 && mode < modes;

@@ -60,6 +60,10 @@ class QV_API ProcessParams : public AnyDict {
     // How the sound is converted: key "audioConversion".
     void setAudioConversion(const AudioConversion& conversion);
     std::optional<AudioConversion> audioConversion() const;
+    // Pictures: whether the last one is repeated up to an out point beyond the end of the input. Key
+    // "holdLast", Int32.
+    void setHoldLast(bool on);
+    bool holdLast() const;
     // 0 off, 1 on, 2 passed on as it stands; others are logged and stored as 0.
     void setSmartRender(int mode);
     int smartRender() const;

@@ -9,6 +9,7 @@ class Signals;
 // `version`: of the tool, for the objects of --progress.
 void addTranscode(CommandLine& line, Signals& signals, const std::string& version);
 void addInfo(CommandLine& line);
+void addLoudness(CommandLine& line);
 void addCaptions(CommandLine& line, Signals& signals);
 void addModules(CommandLine& line);
 void addFormats(CommandLine& line);

@@ -18,11 +18,6 @@ std::string text(const Any& value) {
     return narrow.isString() ? narrow.asString() : "";
 }
 
-// File names need not be UTF-8; JSON does.
-std::string validUtf8(const std::string& bytes) {
-    return Json::parse(Json(bytes).dump(-1, ' ', false, Json::error_handler_t::replace)).get<std::string>();
-}
-
 // Of captions and subtitles. A rate says nothing about subtitles with clock times.
 void describeText(const AnyDict& p, Json& stream) {
     if (p.get("textEncoding").isText()) stream["encoding"] = text(p.get("textEncoding"));

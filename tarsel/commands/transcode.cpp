@@ -27,6 +27,8 @@ int parseBits(const std::string& text) {
 void resolve(Given& given) {
     JobOptions& job = given.job;
     job.effects.check();
+    job.sound.check();
+    if (job.shortest && job.longest) throw failure(Msg::optionsExclude, {"--shortest", "--longest"});
     limitThreads(given.threads);
     if (!job.to.empty() && !job.duration.empty()) throw failure(Msg::optionsExclude, {"--to", "--duration"});
     job.policy = given.outputs.policy();
@@ -86,6 +88,8 @@ void addTranscode(CommandLine& line, Signals& signals, const std::string& versio
     command.option("--samplerate", given->samplerate, "Samples a second", "N");
     command.option("--channels", given->channels, "Channels of the sound, 1 to 8", "N");
     command.option("--bits", given->bits, "Bits of a sample: 8, 16 or 24", "N");
+    command.flag("--shortest", job.shortest, "End the picture with its sound");
+    command.flag("--longest", job.longest, "Hold the last picture until the sound has ended");
     command.option("--muxer", job.muxer, "nullmux: do everything but write", "NAME",
                    {"nullmux", "rawmux", "rawavimux"});
     command.option("--post", job.post,
@@ -101,6 +105,7 @@ void addTranscode(CommandLine& line, Signals& signals, const std::string& versio
     command.flag("--dry-run", job.dryRun, "Print the plan and do nothing");
     given->outputs.add(command);
     command.flag("-q,--quiet", job.quiet, "Say nothing but errors");
+    addSoundOptions(command, job.sound);
     addEffectOptions(command, job.effects);
     command.action([&signals, given] { transcode(*given, signals); },
                    [given, version] { openEvents(*given, version); });

@@ -3,6 +3,7 @@
 #include <algorithm>
 
 #include "tarsel/host/console.h"
+#include "tarsel/host/events.h"
 #include "tarsel/job/jobrun.h"
 #include "tarsel/job/keptchunks.h"
 #include "tarsel/job/outputpipe.h"
@@ -82,6 +83,8 @@ void Job::printPlan() {
     }
     printText(planText(parts_.plan));
     if (!options_.quiet) warnings_.show();
+    if (!options_.quiet)
+        for (const auto& line : parts_.plan.notes) tell(Level::note, line);
 }
 
 void runJob(JobOptions& options, const std::function<std::unique_ptr<Job>()>& make) {

@@ -50,6 +50,8 @@ void JobRun::run() {
     // The result is there, whether or not there is memory to say so.
     try {
         if (!options_.quiet) warnings_.show();
+        if (!options_.quiet)
+            for (const auto& line : plan_.notes) tell(Level::note, line);
         if (!options_.quiet) report(names);
     } catch (const std::bad_alloc&) {
         writeToStderr(FixedLine(Msg::doneUnsaid).text());
@@ -111,6 +113,14 @@ void JobRun::drive(JobTranscoder& transcoder) {
     if (result != 0 && result != QvStatus::endOfStream) throwRunFailure(parts_, transcoder, result);
     if (transcoder.filterFailure()) throw *transcoder.filterFailure();
     written_ = transcoder.written();
+    addClipped(transcoder.clipped());
+}
+
+void JobRun::addClipped(const std::vector<long long>& clipped) {
+    for (size_t i = 0; i < clipped.size(); ++i)
+        if (clipped[i] > 0)
+            warnings_.add(lineOf(Msg::soundClipped, {std::to_string(plan_.streams[i].number),
+                                                     plan_.output.name, std::to_string(clipped[i])}));
 }
 
 // The result of the whole run.

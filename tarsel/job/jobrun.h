@@ -25,6 +25,7 @@ class JobRun {
     void transcode(const std::vector<ProcessParams>& params);
     void drive(JobTranscoder& transcoder);
     int start(JobTranscoder& transcoder);
+    void addClipped(const std::vector<long long>& clipped);
     void checkAndCommit();
     void report(const std::vector<std::string>& names) const;
     void stopIfSignalled() const;

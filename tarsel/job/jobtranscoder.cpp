@@ -11,13 +11,22 @@ namespace {
 constexpr auto kSlowStop = std::chrono::seconds(1);
 constexpr int kErrorLine = 2;  // type of a message of the engine
 
+// All that narrow the samples of a link.
+long long clippedBy(const TransLink& link) {
+    long long clipped = 0;
+    for (int i = 0; const QvCodec* filter = link.filter("aquant", i); ++i)
+        if (const Any count = filter->getParam("clippedSamples"); count.isInt()) clipped += count.toInt64();
+    return clipped;
+}
+
 }  // namespace
 
 JobTranscoder::JobTranscoder(JobParts& parts, Progress& progress)
     : QvTranscoder(parts.stored ? &parts.stored->task() : nullptr),
       parts_(parts),
       progress_(progress),
-      written_(parts.plan.streams.size(), -1) {}
+      written_(parts.plan.streams.size(), -1),
+      clipped_(parts.plan.streams.size(), 0) {}
 
 void JobTranscoder::join(const std::vector<ProcessParams>& params) {
     setEncoder(parts_.pipe.get());
@@ -51,7 +60,10 @@ void JobTranscoder::cbMeasure(double part) {
 // The counts have to be taken before the links close.
 int JobTranscoder::cbMuxClose(QvMuxer*) {
     for (size_t i = 0; i < written_.size(); ++i)
-        if (const TransLink* of = linkOf(parts_.plan.streams[i])) written_[i] = of->outProcessed();
+        if (const TransLink* of = linkOf(parts_.plan.streams[i])) {
+            written_[i] = of->outProcessed();
+            clipped_[i] = clippedBy(*of);
+        }
     takeFilterFailure();
     last_ = state("closing");
     phase_ = "closing";

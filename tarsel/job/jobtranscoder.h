@@ -34,6 +34,8 @@ class JobTranscoder : public QvTranscoder {
     // could not do its work; the others went on without it.
     const ProgressState& last() const { return last_; }
     const std::vector<long long>& written() const { return written_; }
+    // Values that went beyond full scale in each stream of the plan.
+    const std::vector<long long>& clipped() const { return clipped_; }
     const std::optional<Failure>& filterFailure() const { return filterFailure_; }
     // Null for a stream that was not joined.
     const TransLink* linkOf(const PlannedStream& stream) const { return linkFor(stream); }
@@ -66,7 +68,7 @@ class JobTranscoder : public QvTranscoder {
     std::atomic<double> measured_{-1};  // part of the sound; negative where none is measured
     std::atomic<bool> began_{false};    // the run itself
     ProgressState last_;
-    std::vector<long long> written_;
+    std::vector<long long> written_, clipped_;
     std::optional<Failure> filterFailure_;
     std::atomic<bool> stop_{false};
     std::mutex lock_;

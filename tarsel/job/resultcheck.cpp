@@ -90,8 +90,6 @@ void checkResult(const JobParts& parts, const std::vector<long long>& written, b
                                                     std::to_string(s.part.stream)}));
         if (written[i] > s.expected) compare(plan.output.name, written[i], s.expected, s.unit());
         if (written[i] == s.expected) continue;
-        // Sound that has all been written may end within the last frame of the picture.
-        if (written[i] == s.own && s.expected - written[i] <= s.frame) continue;
         const std::string read = std::to_string(written[i]), wanted = std::to_string(s.expected);
         const std::string& name = plan.input(s).name;
         if (!acceptPartial) throw failure(Msg::inputEndedEarly, {name, read, wanted, s.unit()});

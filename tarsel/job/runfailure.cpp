@@ -59,10 +59,6 @@ void throwRunFailure(const JobParts& parts, const JobTranscoder& run, int result
         !reason.empty() && parts.plan.output.place != OutputPlace::nowhere)
         throw writeFailure(output, parts.outputs.withFinalNames(reason));
     if (run.filterFailure()) throw *run.filterFailure();
-    for (const PlannedStream& s : parts.plan.streams)
-        if (const TransLink* link = run.linkOf(s);
-            link && link->errorCode() != 0 && link->outProcessed() == 0 && s.own < s.frame)
-            throw failure(Msg::inputSoundShort, {parts.plan.input(s).name});
     throw failure(Msg::jobFailed, {output, parts.outputs.withFinalNames(run.reason())});
 }
 

@@ -38,17 +38,6 @@ int parseColour(const std::string& text, const std::string& option) {
     return rgb;
 }
 
-double parseDecimal(const std::string& text, double low, double high, const std::string& option) {
-    double value = 0;
-    const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), value);
-    if (error == std::errc() && end == text.data() + text.size() && value >= low && value <= high)
-        return value;
-    char from[32], to[32];
-    std::snprintf(from, sizeof from, "%g", low);
-    std::snprintf(to, sizeof to, "%g", high);
-    throw failure(Msg::decimalWrong, {option, text, from, to});
-}
-
 // Of the names that a parameter offers; a number stands for itself.
 int parseEncoding(const std::string& text, const QvCodec& filter, const std::string& option) {
     const auto lower = [](std::string name) {
@@ -138,13 +127,6 @@ void setStart(QvCodec& filter, const std::string& text, const PictureFormat& pic
 }
 
 }  // namespace
-
-AnyDict stateOf(const QvCodec& codec) {
-    AnyDict state;
-    codec.store(state);
-    state.set("_on", 1);
-    return state;
-}
 
 bool logoIsMoving(const std::string& spec) { return !isStill(parsePlaced(spec).file); }
 

@@ -20,6 +20,3 @@ bool logoIsMoving(const std::string& spec);
 
 // The rectangle that --crop keeps of a picture.
 QvRect parseCrop(const std::string& text, const PictureFormat& picture);
-
-// The state of a codec, switched on.
-AnyDict stateOf(const QvCodec& codec);

@@ -117,6 +117,13 @@ bool Source::isGenerator(const std::string& spec) {
     return spec.rfind(kGenerator, 0) == 0 || spec == "testgen";
 }
 
+AnyDict stateOf(const QvCodec& codec) {
+    AnyDict state;
+    codec.store(state);
+    state.set("_on", 1);
+    return state;
+}
+
 Source::Source(const std::string& spec, const std::string& raw) : name_(spec) {
     if (isGenerator(spec)) {
         isFile_ = false;

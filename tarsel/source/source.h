@@ -57,6 +57,9 @@ class Source {
 // or a value it can't take.
 void setChecked(QvCodec& codec, const std::string& name, const Any& value, const std::string& what);
 
+// The stored state of a filter, switched on.
+AnyDict stateOf(const QvCodec& codec);
+
 // Throws Failure (usage) with `option` in the line if no frame of this format can be had.
 void requireFrame(const std::string& option, unsigned fourcc, int width, int height);
 

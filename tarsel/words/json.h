@@ -4,3 +4,8 @@
 #include <nlohmann/json.hpp>
 
 using Json = nlohmann::ordered_json;
+
+// File names need not be UTF-8; JSON does.
+inline std::string validUtf8(const std::string& bytes) {
+    return Json::parse(Json(bytes).dump(-1, ' ', false, Json::error_handler_t::replace)).get<std::string>();
+}

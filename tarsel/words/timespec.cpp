@@ -256,6 +256,17 @@ long long parseNumber(std::string_view text, long long low, long long high, std:
     return *value;
 }
 
+double parseDecimal(std::string_view text, double low, double high, std::string_view option) {
+    double value = 0;
+    const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), value);
+    if (error == std::errc() && end == text.data() + text.size() && value >= low && value <= high)
+        return value;
+    char from[32], to[32];
+    std::snprintf(from, sizeof from, "%g", low);
+    std::snprintf(to, sizeof to, "%g", high);
+    throw failure(Msg::decimalWrong, {option, text, from, to});
+}
+
 unsigned parsePixel(std::string_view text, std::string_view option) {
     std::vector<std::string> known;
     for (const QvPixelFormat& format : qvPixelFormats()) {

@@ -44,8 +44,9 @@ Size parseSize(std::string_view text, std::string_view option, int most = 65535,
 // The same, or -1 for one of both, which is then -1 here: "1280x-1".
 Size parseSizeOrShape(std::string_view text, std::string_view option);
 
-// A whole number within bounds.
+// A number within bounds.
 long long parseNumber(std::string_view text, long long low, long long high, std::string_view option);
+double parseDecimal(std::string_view text, double low, double high, std::string_view option);
 
 // The FOURCC of a pixel format that the engine knows, as "I420".
 unsigned parsePixel(std::string_view text, std::string_view option);

@@ -168,7 +168,7 @@ TEST_F(Effects, WhatCanNotBeDoneIsTold) {
           {"transcode", "clip.yuv", "--raw", "size=64x48,pixel=I420,rate=25i", "--crop", "32x16+0+2", "-o",
            "x.yuv"},
           {"multiple of 4"});
-    for (const char* option : {"--crop=8x8", "--flip", "--timecode", "--fade=1", "--logo=l.png"})
+    for (const char* option : {"--crop=8x8", "--flip", "--timecode", "--logo=l.png"})
         fails(2, {"transcode", "in.wav", option, "-o", "x.wav"},
               {std::string(option).substr(0, std::string(option).find('=')), "no picture"});
 }

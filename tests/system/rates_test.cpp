@@ -36,7 +36,7 @@ TEST_F(Rates, FramesAndSamplesAreCountedAndRight) {
         {100, "rate=25", "50", {}, 176400, 200, 176400, "0 0 1 1 2 2"},
         {100, "rate=50", "25", {}, 88200, 50, 88200, "0 2 4 6 8 10"},
         {100, "rate=50", "25", {"--from", "10f", "--to", "50f"}, 88200, 20, 35280, "10 12 14 16 18 20"},
-        {99, "rate=50", "25i", {}, 87318, 50, 87318, "0/1 2/3 4/5 6/7 8/9 10/11"},
+        {99, "rate=50", "25i", {}, 87318, 50, 88200, "0/1 2/3 4/5 6/7 8/9 10/11"},
         {96, "rate=24", "30i", {}, 176400, 120, 176400, "0 0/1 1/2 2 3 4 4/5"},
         {96, "rate=24000/1001", "30000/1001i", {}, 176576, 120, 176576, "0 0/1 1/2 2 3 4 4/5"},
         {100, "rate=25", "30000/1001", {}, 176400, 119, 175104, "0 0 1 2 3 4"},
@@ -64,7 +64,8 @@ TEST_F(Rates, FramesAndSamplesAreCountedAndRight) {
         EXPECT_EQ(shown("o.raw", seen + 1), row.first) << what;
         const std::string out = wavPart(contents("o.wav"), "data");
         EXPECT_EQ(static_cast<long long>(out.size()), row.samples * 4) << what;
-        const std::string all = wavPart(sound, "data");
+        std::string all = wavPart(sound, "data");
+        all.resize(std::max(all.size(), out.size()));  // silence up to the end of the last frame
         EXPECT_TRUE(row.more.empty() || row.more[0] != "--from" ? all.compare(0, out.size(), out) == 0
                                                                 : all.find(out) != std::string::npos)
             << what;

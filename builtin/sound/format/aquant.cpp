@@ -6,6 +6,7 @@
 
 #include "builtin/creators.h"
 #include "builtin/sound/format/soundrows.h"
+#include "builtin/sound/soundvalues.h"
 #include "builtin/sound/wordparam.h"
 #include "core/arch/qvassert.h"
 
@@ -25,6 +26,15 @@ constexpr QvParamRow<Settings> rows[] = {
      .member = wordParam<Settings, &Settings::dither, ditherNames>,
      .flags = qvParamStored,
      .help = "none or triangular (noise before rounding to 8 or 16 bits)"},
+    {.name = "clipWarning",
+     .member = &Settings::clipWarning,
+     .flags = qvParamStored,
+     .help = "whether clipped values are warned of, once per open"},
+    {.name = "clippedSamples",
+     .member = &Settings::clipped,
+     .flags = qvParamReadOnly,
+     .unit = "values",
+     .help = "what was clipped since the filter was opened"},
 };
 static_assert(qvParamTableOk<Settings>(rows));
 
@@ -39,6 +49,12 @@ void widen(unsigned char* to, const QvPcm& pcm, size_t count) {
     }
 }
 
+// All widths have the same range. It is counted only where a row says that something was clipped.
+long long countClipped(const int32_t* values, size_t count) {
+    constexpr int32_t low = -(1 << 23), high = (1 << 23) - 1;
+    return std::count_if(values, values + count, [](int32_t value) { return value < low || value > high; });
+}
+
 [[noreturn]] void failFor(const char* what, int bytes) {
     QV_FAIL(Any::sprintf("[aquant::writepcm] invalid %s %d", what, bytes).asString());
 }
@@ -49,11 +65,6 @@ QvCodec* newAquant() { return new QvAquant; }
 
 QvAquant::QvAquant() : StoredFilterOf("aquant::writepcm", rows) {}
 
-int QvAquant::init() {
-    warnOnClip_ = true;
-    return StoredFilterOf::init();
-}
-
 int QvAquant::open() {
     constexpr int widths[] = {8, 16, 20, 24, 32};
     if (std::find(std::begin(widths), std::end(widths), settings_.outBits) == std::end(widths))
@@ -61,6 +72,7 @@ int QvAquant::open() {
                         "Error Opening audio quantization converter, invalid out bits per sample (%d)",
                         settings_.outBits);
     clipReported_ = false;
+    settings_.clipped = 0;
     ditherPlace_ = 0;
     return StoredFilterOf::open();
 }
@@ -94,7 +106,8 @@ int QvAquant::write(QvPcm& pcm) {
     else
         clipped = narrow(room, reinterpret_cast<const int32_t*>(pcm.ptr(0)), count, out);
     output_.copyMeta(pcm);
-    if (clipped && warnOnClip_ && !clipReported_) {
+    if (clipped) settings_.clipped += countClipped(soundValues(pcm), count);
+    if (clipped && settings_.clipWarning && !clipReported_) {
         clipReported_ = true;
         qv_log()->warning("Audio clipping detected. Please reduce audio processing gain");
     }

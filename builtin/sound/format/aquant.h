@@ -5,8 +5,11 @@
 //   8
 //                                          or 16 bits, noise of triangular distribution, two steps wide, is
 //                                          added before rounding. It is the same in every run
+//   "clipWarning"        flag     1        whether clipped values are warned of, once per open
+//   "clippedSamples"     int64    0        read-only: the values that were clipped since the filter was
+//   opened
 //
-// Sound of the same width is copied. Values out of range take the nearest bound, with one warning per open.
+// Sound of the same width is copied. Values out of range take the nearest bound.
 #pragma once
 
 #include "builtin/sound/storedfilter.h"
@@ -16,19 +19,20 @@ struct AquantSettings {
 
     int outBits = 24;
     Dither dither = none;
+    bool clipWarning = true;
+    long long clipped = 0;  // values
 };
 
 class QvAquant : public StoredFilterOf<AquantSettings> {
   public:
     QvAquant();
 
-    int init() override;
     int open() override;
     int write(QvPcm& pcm) override;
 
   private:
     bool narrow(unsigned char* to, const int32_t* from, size_t count, int bytes);
 
-    bool warnOnClip_ = false, clipReported_ = false;
+    bool clipReported_ = false;
     uint32_t ditherPlace_ = 0;  // values that were dithered so far, modulo 2^32
 };

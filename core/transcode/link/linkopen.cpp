@@ -10,6 +10,7 @@ LinkOpen::LinkOpen(const AnyDict* params) {
     takeAudioEffects(params->getDict("audioEffects"));
     connMatrix = params->getVector("connMatrix");
     conversion = AudioConversion(params->getDict("audioConversion"));
+    holdLast = params->getInt32("holdLast", 0) != 0;
     qualityStats = params->getVector("qualityStats");
     smartRender = params->getInt32("smartRender", 0);
     passPicture = params->get("smartRender").isTrue();

@@ -9,8 +9,9 @@
 
 struct LinkOpen {
     LinkOpen() = default;
-    // "inOutPoints", "chapters", "effects", "audioEffects", "connMatrix", "audioConversion", "smartRender",
-    // "qualityStats"; what is absent or of another type counts as not given. Null gives nothing.
+    // "inOutPoints", "chapters", "effects", "audioEffects", "connMatrix", "audioConversion", "holdLast",
+    // "smartRender", "qualityStats"; what is absent or of another type counts as not given. Null gives
+    // nothing.
     explicit LinkOpen(const AnyDict* params);
     void takeAudioEffects(const AnyDict& filters);  // a FiltersState
 
@@ -21,6 +22,7 @@ struct LinkOpen {
     AnyVector audioFilters;             // stored filters, in order
     AnyVector connMatrix;               // one entry an output channel; empty: not given
     AudioConversion conversion;
+    bool holdLast = false;  // pictures
     AnyVector qualityStats;
     // Sound has several modes and takes an Int32 alone; for a picture anything true is on.
     int smartRender = 0;

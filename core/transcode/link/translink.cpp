@@ -75,6 +75,7 @@ void TransLink::setProcessParams(const ProcessParams& params) {
     if (const auto filters = params.filters()) processParams_.setFilters(*filters);
     if (const auto* map = params.audioChannelMap()) processParams_.setAudioChannelMap(*map);
     if (const auto conversion = params.audioConversion()) processParams_.setAudioConversion(*conversion);
+    if (params.holdLast()) processParams_.setHoldLast(true);
     if (const auto logs = params.getQualityStatsSetup()) processParams_.setQualityLog(*logs);
 }
 

@@ -35,7 +35,8 @@ class QV_API TransLink {
     // -1 for an encoder stream that does not exist (video); misuse asserts.
     virtual int init(QvDecodePipe* decoder, int decStream, QvEncodePipe* encoder, int encStream);
     // Reads the formats, takes the points and builds the conversion. `params` (may be null): "inOutPoints",
-    // "chapters", "effects", "audioEffects", "connMatrix", "audioConversion", "smartRender", "qualityStats".
+    // "chapters", "effects", "audioEffects", "connMatrix", "audioConversion", "holdLast", "smartRender",
+    // "qualityStats".
     // -1 when open already.
     virtual int open(const AnyDict* params);
     // Ends the run. A closed link is left alone: 0. Otherwise 0 or what a filter failed with since open, here

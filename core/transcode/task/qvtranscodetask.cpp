@@ -111,6 +111,7 @@ int QvTask::link(QvDecodePipe* decoder, int type, int decStream, int encStream, 
     if (params.get("filters").isDict() && !params.get("filters").asDict().empty())
         own.set("filters", params.get("filters"));
     if (const auto conversion = params.audioConversion()) own.setAudioConversion(*conversion);
+    if (params.holdLast()) own.setHoldLast(true);
     if (own.empty()) return index;
     if (TransLink* made = getLinkForInput(decoder, type, decStream)) made->setProcessParams(own);
     return index;
@@ -271,6 +272,7 @@ int QvTask::setProcessParams(const ProcessParams& params, int typeMask) {
                           "QvTask.setProcessParams: cannot apply audioConversion to non-audio stream");
             own.setAudioConversion(*conversion);
         }
+        if (params.holdLast() && type == qvVideoStream) own.setHoldLast(true);
         if (params.getInt32("smartRender", 0) != 0) own.set("smartRender", params.get("smartRender"));
     }
     return QvStatus::ok;
@@ -305,6 +307,7 @@ constexpr OpenRow openRows[] = {
     {"audioChannelMap", "connMatrix", isVector, qvAudioStream},
     {"audioConversion", "audioConversion", isDict, qvAudioStream},
     {"chapters", "chapters", isVector, qvVideoStream},
+    {"holdLast", "holdLast", isMode, qvVideoStream},
 };
 
 }  // namespace

@@ -1,4 +1,4 @@
-// Which filters each stream of a job passes, and the format in which pictures come out of them.
+// Which filters each picture of a job passes, and the format in which it comes out of them.
 #pragma once
 
 #include <vector>
@@ -7,24 +7,19 @@
 
 struct JobPlan;
 struct PlannedStream;
-struct SoundFormat;
-
-// The time at the start of the sound that filters let the link skip.
-MediaTime skippedSound(const FiltersState& filters, const SoundFormat& in, const SoundFormat& out);
 
 class FilterPlanner {
   public:
     // Sets the format of each video stream, which the lengths depend on. Both have to outlive the planner.
     // Throws Failure for options that do not fit a stream.
     FilterPlanner(JobPlan& plan, const EffectOptions& options);
-    // Sets the filters of all streams and what they read and write. The lengths have to be known. Throws
+    // Sets the filters of all pictures and what they read and write. The lengths have to be known. Throws
     // Failure for filters that can't be used, or that have nothing to work on.
     void plan();
 
   private:
     void checkEffects() const;
     void planPicture(PlannedStream& stream);
-    void planSound(PlannedStream& stream) const;
 
     JobPlan& plan_;
     const EffectOptions& options_;

@@ -6,6 +6,7 @@
 #include "tarsel/job/plan/filters.h"
 #include "tarsel/job/plan/lengths.h"
 #include "tarsel/job/plan/points.h"
+#include "tarsel/job/plan/soundplan.h"
 #include "tarsel/words/messages.h"
 #include "tarsel/words/timespec.h"
 
@@ -14,11 +15,6 @@ namespace {
 // By --no-video and --no-audio.
 bool unwanted(const PlanOptions& options, int type) {
     return type == qvVideoStream ? options.noVideo : options.noAudio;
-}
-
-int count(const JobPlan& plan, int type) {
-    return static_cast<int>(std::count_if(plan.streams.begin(), plan.streams.end(),
-                                          [&](const auto& s) { return s.type == type; }));
 }
 
 SoundFormat soundFormat(const PlanOptions& options, const SoundFormat& in) {
@@ -31,12 +27,14 @@ void takeStreams(JobPlan& plan, const PlanOptions& options) {
         for (const int type : {qvVideoStream, qvAudioStream}) {
             if (unwanted(options, type) || (type == qvVideoStream && plan.output.kind == OutputKind::wav))
                 continue;
-            if (plan.output.takesOneStream() && !plan.streams.empty()) continue;
+            // --map chooses one of the sounds.
+            const bool chosen = !options.sound.map.empty() && type == qvAudioStream && !plan.hasVideo();
+            if (plan.output.takesOneStream() && !plan.streams.empty() && !chosen) continue;
             const auto& streams = plan.inputs[input].streams(type);
             for (size_t i = 0; i < streams.size(); ++i) {
                 PlannedStream stream;
                 stream.type = type;
-                stream.number = count(plan, type);
+                stream.number = plan.count(type);
                 stream.part.input = static_cast<int>(input);
                 stream.part.stream = static_cast<int>(i);
                 stream.picture = streams[i].picture;
@@ -74,7 +72,7 @@ void checkCounts(const JobPlan& plan) {
     const OutputForm& output = plan.output;
     if (!output.isFiles() || output.kind == OutputKind::avi) return;
     for (const int type : {qvVideoStream, qvAudioStream}) {
-        const int streams = count(plan, type);
+        const int streams = plan.count(type);
         if (streams < 2) continue;
         const char* what = type == qvVideoStream ? "picture" : "sound";
         if (output.kind == OutputKind::pictures || output.splitChannels)
@@ -117,12 +115,21 @@ long long PlannedStream::bytes(long long units) const {
 
 ProcessParams PlannedStream::params() const {
     ProcessParams params;
-    if (!part.whole) params.setInOutPoints(InOutPoints(part.in, part.out));
+    if (!part.whole || delayed > MediaTime()) params.setInOutPoints(InOutPoints(part.in, part.out + delayed));
     if (!filters.empty()) params.setFilters(filters);
+    if (hold) params.setHoldLast(true);
+    if (isVideo()) return params;
+    if (!channelMap.empty()) params.setAudioChannelMap(channelMap);
+    params.setAudioConversion(conversion);
     return params;
 }
 
-bool JobPlan::hasVideo() const { return count(*this, qvVideoStream) > 0; }
+int JobPlan::count(int type) const {
+    return static_cast<int>(
+        std::count_if(streams.begin(), streams.end(), [&](const auto& s) { return s.type == type; }));
+}
+
+bool JobPlan::hasVideo() const { return count(qvVideoStream) > 0; }
 
 const JobInput& JobPlan::input(const PlannedStream& stream) const {
     return inputs[static_cast<size_t>(stream.part.input)];
@@ -156,13 +163,17 @@ JobPlan planJob(const PlanOptions& options, const OutputForm& output, std::vecto
     effects.pixel = output.pixel;
     FilterPlanner filters(plan, effects);
     checkKinds(plan, options);
+    SoundPlanner sounds(plan, options);
     checkCounts(plan);
     checkChannels(plan, options);
     warnOfUnused(plan, options);
     planPoints(plan, {options.from, options.to, options.duration});
+    sounds.planDelays();
+    planEnds(plan, options.shortest, options.longest);
     planFrames(plan);
-    filters.plan();
     planSamples(plan);
+    filters.plan();
+    sounds.planFilters();
     return plan;
 }
 

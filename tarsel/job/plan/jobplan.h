@@ -29,12 +29,15 @@ struct PlannedStream {
     PictureFormat picture;           // of video
     SoundFormat sound;               // of audio
     FiltersState filters;            // that the user asks for
+    AnyVector channelMap;            // of audio; empty for the default
+    AudioConversion conversion;      // of audio
     std::vector<std::string> chain;  // a line for each filter, to be shown
 
     long long expected = 0;  // frames or samples of the output
+    bool hold = false;       // video: the last frame is repeated up to the end of the part
     MediaTime skipped;       // audio: of the input, for a filter that lets the sound come earlier
+    MediaTime delayed;       // audio: so much later it comes and ends
     long long own = 0;       // audio: samples of the output that the part itself has
-    long long frame = 0;     // audio: most samples that belong to one frame of the picture; 0 without one
 
     bool isVideo() const { return type == qvVideoStream; }
     std::string encoder() const { return module.empty() ? isVideo() ? "rawvenc" : "rawaenc" : module; }
@@ -51,7 +54,9 @@ struct JobPlan {
     std::vector<PlannedStream> streams;
     FilterFiles filterFiles;
     std::vector<std::string> warnings;
+    std::vector<std::string> notes;  // what is said without being a warning
 
+    int count(int type) const;  // of streams
     bool hasVideo() const;
     const JobInput& input(const PlannedStream& stream) const;
     // The one that `stream` is a part of.

@@ -7,6 +7,7 @@
 #include <vector>
 
 #include "tarsel/picture/effects.h"
+#include "tarsel/sound/soundoptions.h"
 
 enum class OutputKind {
     raw,
@@ -24,8 +25,10 @@ struct PlanOptions {
     std::string from, to, duration;
     std::optional<OutputKind> kind;  // of a stored task's output, whatever its name says
     EffectOptions effects;
+    SoundOptions sound;
     std::optional<int> samplerate, channels, bits;
     bool noVideo = false, noAudio = false;
+    bool shortest = false, longest = false;
     bool splitChannels = false;
     bool acceptPartial = false;
 };

@@ -21,9 +21,11 @@ class Points {
         part.in = MediaTime();
         part.out = length;
         parse(part, rateFor(input));
-        check(part, input, length);
+        const bool follows = !stream.isVideo() && plan_.hasVideo();
+        check(part, input, length, follows);
+        if (part.in > length) part.in = length;
         if (part.out <= length) return;
-        if (stream.isVideo() || !plan_.hasVideo()) warn(input, length);
+        if (!follows) warn(input, length);
         part.out = length;
     }
 
@@ -46,12 +48,13 @@ class Points {
         if (!options_.duration.empty()) part.out = parseSpan(options_.duration, rate, "--duration", part.in);
     }
 
-    void check(const StreamPart& part, const JobInput& input, const MediaTime& length) const {
+    // `follows`: a sound that has ended before is silence next to its picture.
+    void check(const StreamPart& part, const JobInput& input, const MediaTime& length, bool follows) const {
         if (part.out <= part.in && !options_.to.empty())
             throw failure(Msg::toNotAfter, {options_.to, start()});
         if (part.out <= part.in && !options_.duration.empty())
             throw failure(Msg::durationNone, {options_.duration});
-        if (part.in >= length && !options_.from.empty())
+        if (part.in >= length && !options_.from.empty() && !follows)
             throw failure(Msg::fromAfterEnd, {options_.from, input.name, formatTime(length.seconds())});
     }
 

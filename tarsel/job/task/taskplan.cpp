@@ -3,8 +3,8 @@
 #include <algorithm>
 #include <cstring>
 
-#include "tarsel/job/plan/filters.h"
 #include "tarsel/job/plan/lengths.h"
+#include "tarsel/job/plan/soundplan.h"
 #include "tarsel/words/messages.h"
 
 namespace {
@@ -36,13 +36,17 @@ void readSound(const QvCodec& encoder, SoundFormat& format) {
               ask("bitsPerSample", format.bits)};
 }
 
-void readPoints(const ProcessParams& params, const MediaTime& length, StreamPart& part) {
+// Sound that ends after its stream is sound that comes later.
+void readPoints(const ProcessParams& params, const MediaTime& length, PlannedStream& stream) {
+    StreamPart& part = stream.part;
     part.out = length;
     const auto points = params.inOutPoints();
     if (!points || points->count() == 0) return;
     part.whole = false;
     part.in = points->inPoint();
-    if (points->outPoint() > MediaTime() && points->outPoint() < length) part.out = points->outPoint();
+    const MediaTime out = points->outPoint();
+    if (out > MediaTime() && out < length) part.out = out;
+    if (out > length && !stream.isVideo()) stream.delayed = out - length;
 }
 
 void readFilters(PlannedStream& stream, FilterFiles& files) {
@@ -69,11 +73,14 @@ PlannedStream plannedStream(JobPlan& plan, const TransLink& link, int input) {
     stream.sound = source.sound;
     stream.isVideo() ? readPicture(encoder, stream.picture) : readSound(encoder, stream.sound);
     const ProcessParams& params = link.processParams();
-    readPoints(params, source.end(), stream.part);
+    readPoints(params, source.end(), stream);
+    stream.hold = params.holdLast();
+    if (params.audioChannelMap()) stream.channelMap = *params.audioChannelMap();
+    if (const auto conversion = params.audioConversion()) stream.conversion = *conversion;
     if (const auto filters = params.filters()) stream.filters = *filters;
     readFilters(stream, plan.filterFiles);
     if (!stream.isVideo() && !stream.filters.empty())
-        stream.skipped = skippedSound(stream.filters, source.sound, stream.sound);
+        stream.skipped = skippedSound(stream.filters.getVector("customFilters"), source.sound, stream.sound);
     return stream;
 }
 

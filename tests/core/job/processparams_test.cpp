@@ -40,9 +40,13 @@ TEST(ProcessParams, KeepWhatDiffersFromThePlainConversion) {
     AudioConversion conversion;
     conversion.rateQuality = "high";
     conversion.dither = "triangular";
+    conversion.clipWarning = false;
+    conversion.padEnd = true;
     params.setAudioConversion(conversion);
     EXPECT_EQ(params.audioConversion()->rateQuality, "high");
     EXPECT_EQ(params.audioConversion()->dither, "triangular");
+    EXPECT_FALSE(params.audioConversion()->clipWarning);
+    EXPECT_TRUE(params.audioConversion()->padEnd);
     params.set("audioConversion", AnyDict("rateQuality", 3));
     EXPECT_EQ(params.audioConversion()->rateQuality, "standard");
 }

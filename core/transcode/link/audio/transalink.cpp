@@ -85,6 +85,7 @@ int TransALink::openWith(const LinkOpen& given) {
     if (opened_) return QvStatus::failed;
     audioPipe_.reset();
     smartRendering_ = false;
+    padsEnd_ = given.conversion.padEnd;
     readLogProgress();
     if (given.frameNumbers) QV_FAIL("startFrame and stopFrame are deprecated. Use 'inOutPoints'.");
     AnyDict stream;
@@ -102,7 +103,8 @@ int TransALink::openWith(const LinkOpen& given) {
     setupSmartRender(given.smartRender);
     if (const int result = openPipe()) return result;
     steps_ = 0;
-    finished_ = worked_ = false;
+    finished_ = isEmpty();
+    worked_ = wasFinished_ = false;
     opened_ = true;
     return QvStatus::ok;
 }
@@ -167,7 +169,7 @@ int TransALink::takeRange(const LinkOpen& given) {
     const bool points = takePoints(given, endOfInput());
     qv_dbg()->debug("%s", points ? "ALink.open: In/out points are set."
                                  : "ALink.open: In/out points constructed from duration.");
-    if (points && outPoint() <= inPoint())
+    if (points && outPoint() <= inPoint() && !padsEnd_)
         return setError(QvStatus::failed, "The out point is not after the in point");
     return QvStatus::ok;
 }
@@ -207,7 +209,11 @@ void TransALink::setupSmartRender(int mode) {
     clock_->passThrough();
 }
 
+// A range without a sample, in whose place there is silence.
+bool TransALink::isEmpty() const { return padsEnd_ && clock_->inEnd() <= clock_->inStart(); }
+
 int TransALink::openPipe() {
+    if (isEmpty()) audioPipe_.reset();
     if (!audioPipe_) return QvStatus::ok;
     if (!QvProcessUtil::applyStreamReport(audioPipe_.get(), decoder_, decStreamNr_, clock_->inStart(),
                                           clock_->inEnd(), readWatch_)) {
@@ -288,7 +294,7 @@ int TransALink::processFrame(int n) {
         return QvStatus::ok;
     }
     if (smartRendering_) return smartStep(n);
-    if (finished_) {
+    if (finished_ && !(padsEnd_ && audioPipe_)) {
         QV_STEP_LOG("ALink", "silence samples=%d", n);
         return _insertSilence(n);
     }
@@ -312,28 +318,36 @@ int TransALink::directStep(int n) {
     QV_STEP_LOG("ALink", "read samples %d", n);
     const int read = decoder_->readSamples(n, decStreamNr_);
     QV_STEP_LOG("ALink", "read samples done, result=%d", read);
+    const bool isSound = read >= 0 || read == QvStatus::endOfStream;
     if (read < n) {
         finished_ = true;
-        if (!worked_) return readFailed();
+        if (!worked_ && !(padsEnd_ && isSound)) return readFailed();
     }
     int result = QvStatus::ok;
     const bool holds = pcm && pcm->inited() && pcm->samples() > 0;
-    if (holds && (read >= 0 || read == QvStatus::endOfStream)) {
+    const long long before = clock_->written();
+    if (holds && isSound) {
         QV_STEP_LOG("ALink", "writePcm samples=%d", pcm->samples());
         result = audioEncoder()->writePcm(pcm, -1);
         QV_STEP_LOG("ALink", "writePcm done result=%d", result);
         clock_->wrote(pcm->samples());
     }
+    if (padsEnd_ && result == QvStatus::ok)
+        result = fillStep(n - static_cast<int>(clock_->written() - before));
     return endStep(result);
 }
+
+int TransALink::fillStep(int count) { return count > 0 ? _insertSilence(count) : QvStatus::ok; }
 
 // What the pipe has beyond the samples that are due stays in it.
 int TransALink::pipeStep(int n) {
     QV_STEP_LOG("ALink", "aprocess samples=%d", n);
     const int processed = audioPipe_->process(decoder_, decStreamNr_, n);
     QV_STEP_LOG("ALink", "aprocess done, result=%d", processed);
-    if (processed != QvStatus::ok) {
+    const bool padded = padsEnd_ && processed == QvStatus::endOfStream;
+    if (processed != QvStatus::ok && !padded) {
         finished_ = true;
+        padsEnd_ = false;  // what has failed is not asked again
         if (!worked_) return readFailed();
     }
     auto* pcm = audioPipe_->pcm();
@@ -353,7 +367,8 @@ int TransALink::endStep(int result) {
     if (result != QvStatus::ok) copyError(result, audioEncoder()->errorDesc());
     if (clock_->complete()) finished_ = true;
     ++steps_;
-    if (finished_) logDone("Audio processing done");
+    if (finished_ && !wasFinished_) logDone("Audio processing done");
+    wasFinished_ = finished_;
     worked_ = true;
     QV_STEP_LOG("ALink", "processFrame done, result=%d", result);
     return result == QvStatus::endOfStream ? QvStatus::ok : result;

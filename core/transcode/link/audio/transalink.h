@@ -62,10 +62,13 @@ class QV_API TransALink : public TransLink {
     int openPipe();
     QvAudioEncoder* audioEncoder() const;
 
+    bool isEmpty() const;
+
     int smartStep(int n);
     int directStep(int n);
     int pipeStep(int n);
     int endStep(int result);
+    int fillStep(int count);
     int readFailed();
     void logDone(const char* what) const;
     bool prepareSilence(int n);
@@ -80,4 +83,6 @@ class QV_API TransALink : public TransLink {
     QvPcm silence_;
     int steps_ = 0;  // that did work
     bool smartRendering_ = false;
+    bool padsEnd_ = false;      // AudioConversion::padEnd
+    bool wasFinished_ = false;  // before the last step
 };

@@ -131,6 +131,8 @@ int TransVLink::takeRange(const LinkOpen& given, const VideoFormat& in) {
     if (points && range.empty()) return setError(QvStatus::failed, "The out point is not after the in point");
     range.convert(in.framerate, outFramerate_);
     *range_ = range;
+    lastFrame_ = given.holdLast ? in.frames - 1 : -1;
+    held_ = 0;
     return QvStatus::ok;
 }
 
@@ -303,7 +305,7 @@ void TransVLink::pipeStep(Step& step) {
 
 void TransVLink::directStep(Step& step) {
     QV_STEP_LOG("VLink", "readFrame...");
-    step.read = decoder_->readFrame(decStreamNr_);
+    step.read = readFrame();
     QV_STEP_LOG("VLink", "readFrame done, result=%d", step.read);
     if (step.read == QvStatus::endOfStream) {
         qv_dbg()->debug("VLink @ %p: End of input stream", static_cast<void*>(this));
@@ -346,10 +348,24 @@ void TransVLink::repeatLast(Step& step) {
     ++framesWritten_;
 }
 
+// Where the last frame is held it is read again, as filters may have changed what the decoder gave.
+int TransVLink::readFrame() {
+    const int result = held_ == 0 ? decoder_->readFrame(decStreamNr_) : QvStatus::endOfStream;
+    if (result != QvStatus::endOfStream || lastFrame_ < 0) return result;
+    if (decoder_->seekToFrame(lastFrame_, decStreamNr_) != QvStatus::ok) return QvStatus::failed;
+    const int again = decoder_->readFrame(decStreamNr_);
+    QvFrame* frame = decoder_->getFramePtr(decStreamNr_);
+    if (again != QvStatus::ok || !frame) return QvStatus::failed;
+    frame->frameNr = lastFrame_ + ++held_;
+    frame->clearUserData();
+    frame->clearSubpic();
+    return again;
+}
+
 int TransVLink::_processOneFrame() {
     int result = videoPipe_->process(nullptr, 0);
     while (result == QvStatus::needsInput) {
-        const int read = decoder_->readFrame(decStreamNr_);
+        const int read = readFrame();
         QvFrame* frame = read == QvStatus::endOfStream ? completePair() : nullptr;
         if (read != QvStatus::ok && !frame) return read;
         if (read == QvStatus::ok) {

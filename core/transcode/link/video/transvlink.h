@@ -68,12 +68,15 @@ class QV_API TransVLink : public TransLink {
     void repeatLast(Step& step);
     int _processOneFrame();
     bool losesAll() const;
+    int readFrame();
     QvFrame* completePair();
     void feedMetaSources(QvFrame* frame);
     int writeFrame(QvFrame* frame);
 
     QvFramerate outFramerate_;
     std::unique_ptr<QvFrameRange> range_;        // never null
+    int lastFrame_ = -1;                         // of the input, where it is held; otherwise -1
+    int held_ = 0;                               // how often it was read again
     std::unique_ptr<SmartRender> smartRender_;   // never null
     std::unique_ptr<QualityLog> qualityLog_;     // null unless logging
     std::unique_ptr<QvVProcessPipe> videoPipe_;  // null when no processing is needed

@@ -90,6 +90,11 @@ TEST(Aquant, WarnsOnceOfClipping) {
             filter.open();
             throughFilter(filter, bytesOf(row.values), 1, 4);
             EXPECT_EQ(log.count(clipWarning, QvLogMask::warning), 2 * row.warnings) << "again after open";
+            EXPECT_EQ(filter.getParam("clippedSamples").toInt64(), row.warnings) << "from open on";
+            filter.setParam("clipWarning", 0);
+            for (int i = 0; i < 2; ++i) throughFilter(filter, bytesOf(row.values), 1, 4);
+            EXPECT_EQ(filter.getParam("clippedSamples").toInt64(), 3 * row.warnings);
+            EXPECT_EQ(log.count(clipWarning, QvLogMask::warning), 2 * row.warnings) << "switched off";
         }
 }
 

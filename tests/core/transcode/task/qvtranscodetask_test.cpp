@@ -13,6 +13,7 @@ const AnyVector otherPoints(Any(MediaTime(3.0)), Any(MediaTime(4.0)));
 TEST(TaskParams, ALinksOwnWinOverTheTasks) {
     Job job;
     ProcessParams own(AnyDict("inOutPoints", points, "chapters", AnyVector(Any(5)), "smartRender", 2));
+    own.setHoldLast(true);
     own.set("filters", AnyDict());
     ASSERT_EQ(job.task.link(&job.decoder, 1, 0, 0, own), 0);
     ASSERT_EQ(job.task.link(&job.decoder, 2, 0, 0), 1);
@@ -25,7 +26,7 @@ TEST(TaskParams, ALinksOwnWinOverTheTasks) {
     AnyVector params;
     QvTask::makeOpenParams(job.task, job.task.links(), params);
     EXPECT_EQ(params, AnyVector(Any(AnyDict("inOutPoints", points, "chapters", AnyVector(Any(5)),
-                                            "smartRender", 1, "effects", AnyDict("a", 1))),
+                                            "smartRender", 1, "effects", AnyDict("a", 1), "holdLast", 1)),
                                 Any(AnyDict("inOutPoints", otherPoints, "smartRender", 1, "audioEffects",
                                             AnyDict("b", 1), "connMatrix", AnyVector(Any(7)),
                                             "audioConversion", AnyDict("dither", "triangular")))));

@@ -61,6 +61,28 @@ TEST(TransALink, SilenceFollowsAShortStream) {
     }
 }
 
+// Every step is whole, from the first one on.
+TEST(TransALink, PadsTheEndToTheSampleWhereItIsAsked) {
+    for (const int samples : {0, 1, 999, 1000, 2500})
+        for (const int bits : {8, 16}) {  // through a pipe, and without one
+            SCOPED_TRACE(testing::Message() << samples << " samples to " << bits << " bits");
+            Job job(samples, 48000, 48000, 2, 2, bits);
+            job.decoder.tracks[0]->total = samples;
+            job.params.set("audioConversion", AnyDict("padEnd", 1));
+            ASSERT_EQ(job.open(), 0);
+            for (const int n : {1000, 1000, 1601}) {
+                const size_t before = job.audio().values.size();
+                EXPECT_EQ(job.link.processFrame(n), 0);
+                EXPECT_EQ(job.audio().values.size() - before, static_cast<size_t>(n));
+            }
+            EXPECT_EQ(job.link.outProcessed(), 3601);
+            if (bits == 8) continue;
+            const auto begin = job.audio().values.begin() + samples;
+            EXPECT_EQ(std::count(begin, job.audio().values.end(), 0), 3601 - samples);
+            EXPECT_EQ(std::count(job.audio().values.begin(), begin, 0), 0) << "the sound itself";
+        }
+}
+
 TEST(TransALink, FailuresComeOut) {
     const struct {
         std::function<void(Job&)> arrange;

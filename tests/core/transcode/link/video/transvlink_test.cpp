@@ -152,6 +152,20 @@ TEST(TransVLink, AFilterThatTakesNoFrameEndsTheJob) {
     EXPECT_TRUE(job.encoder.video.numbers.empty());
 }
 
+TEST(TransVLink, HoldsTheLastFrameUpToThePointWhereItIsAsked) {
+    for (const bool pipe : {false, true}) {
+        Job job(10);
+        if (pipe)
+            job.params.set("effects", customFilters(AnyVector(Any(AnyDict("name", "videofade", "_on", 1)))));
+        job.params.set("inOutPoints", pointsOf(frameTime(7, f25), frameTime(15, f25)));
+        job.params.set("holdLast", 1);
+        ASSERT_EQ(job.open(), 0);
+        EXPECT_EQ(job.run(), 0);
+        EXPECT_EQ(job.encoder.video.numbers, range(7, 15)) << "frames have the numbers of their places";
+        EXPECT_EQ(job.link.outProcessed(), 8);
+    }
+}
+
 TEST(TransVLink, TruncatedInputEndsWithoutError) {
     Job job(10);
     job.decoder.truncatedAt = 4;
