@@ -8,6 +8,8 @@
 #include "tarsel/job/keptchunks.h"
 #include "tarsel/job/outputpipe.h"
 #include "tarsel/job/savedtask.h"
+#include "tarsel/sound/channelmap.h"
+#include "tarsel/source/joinedsound.h"
 #include "tarsel/words/messages.h"
 
 Job::Job(const JobOptions& options, Signals& signals)
@@ -17,6 +19,7 @@ Job::Job(const JobOptions& options, Signals& signals)
       warnings_(options.warnings) {
     openInputs();
     lengths_ = InputLengths(parts_.sources);
+    joinSounds();
     parts_.plan = planJob(options_, parts_.outputs.form(), readInputs());
     warnings_.add(parts_.plan.warnings);
     warnings_.addEngine([this](const std::string& text) { return parts_.outputs.withFinalNames(text); });
@@ -41,7 +44,36 @@ void Job::openInputs() {
 std::vector<JobInput> Job::readInputs() const {
     std::vector<JobInput> inputs;
     for (const auto& source : parts_.sources) inputs.push_back(readInput(*source));
+    if (joined_) inputs.back().joined = true;
     return inputs;
+}
+
+// Where --map takes channels of several sounds, they become one sound of a further input.
+void Job::joinSounds() {
+    if (options_.sound.map.empty()) return;
+    const std::vector<int> sounds = parseChannelMap(options_.sound.map).sounds();
+    std::vector<JoinedSound::Part> all, parts;
+    std::vector<std::string> names;
+    for (const auto& source : parts_.sources)
+        for (int i = 0; i < source->decoder().nrStreams(qvAudioStream); ++i) {
+            if (std::binary_search(sounds.begin(), sounds.end(), static_cast<int>(all.size()))) {
+                parts.push_back({&source->decoder(), i});
+                names.push_back(source->name());
+            }
+            all.push_back({&source->decoder(), i});
+        }
+    // The plan refuses what is not there.
+    if (sounds.size() < 2 || parts.size() < sounds.size()) return;
+    const auto rateOf = [&](size_t part) {
+        return parts[part].decoder->getAudioParam(parts[part].stream, "samplerate").asInt32(0);
+    };
+    for (size_t i = 1; i < parts.size(); ++i)
+        if (rateOf(i) != rateOf(0))
+            throw failure(Msg::mapSounds, {std::to_string(sounds[i]), std::to_string(rateOf(i)),
+                                           std::to_string(sounds[0]), std::to_string(rateOf(0))});
+    parts_.sources.push_back(
+        std::make_unique<Source>(joined(names, " + "), std::make_unique<JoinedSound>(parts)));
+    joined_ = true;
 }
 
 // What filters read is an input as well.

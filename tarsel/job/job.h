@@ -23,6 +23,7 @@ class Job {
 
   private:
     void openInputs();
+    void joinSounds();
     std::vector<JobInput> readInputs() const;
     std::vector<std::string> filesRead() const;
 
@@ -30,5 +31,6 @@ class Job {
     Signals& signals_;
     JobParts parts_;
     InputLengths lengths_;
+    bool joined_ = false;  // the last source
     Warnings warnings_;
 };

@@ -141,6 +141,9 @@ Source::Source(const std::string& spec, const std::string& raw) : name_(spec) {
         openRaw(raw);
 }
 
+Source::Source(const std::string& name, std::unique_ptr<QvDecodePipe> decoder)
+    : name_(name), isFile_(false), decoder_(std::move(decoder)) {}
+
 bool Source::describesItself(const std::string& spec) {
     if (isGenerator(spec)) return true;
     const Any ext = QvFile::getExt(Any(spec.c_str()), true);

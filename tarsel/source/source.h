@@ -13,6 +13,8 @@ class Source {
     // `spec`: a file name, or "testgen:size=1280x720,rate=25,duration=10". `raw`: the format of a raw file
     // ("size=352x288,pixel=I420,rate=25"), empty to open by extension. Throws Failure.
     Source(const std::string& spec, const std::string& raw);
+    // What others are read through.
+    Source(const std::string& name, std::unique_ptr<QvDecodePipe> decoder);
 
     // Whether an input of this name needs no format from outside: the generator, or an extension with a
     // decoder.

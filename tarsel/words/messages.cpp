@@ -126,7 +126,8 @@ constexpr Message kMessages[] = {
     // sound
     {Msg::mapWrong,        Exit::usage,  "--map",                                               "{name} is no list of channels",                                         "use as 1,0 or 0+1,-,a:1.0"},
     {Msg::mapLong,         Exit::usage,  "--map",                                               "it asks for {text} than the {text} that can be made",                   "give fewer"},
-    {Msg::mapSounds,       Exit::usage,  "--map",                                               "the sounds {text} and {text} can't go into one output",                 "take the channels of one of them"},
+    {Msg::mapSounds,       Exit::usage,  "--map",                                               "sound {text} has another rate ({text} Hz) than sound {text} ({text} Hz)", "convert one of them first, with --samplerate"},
+    {Msg::mapNoTask,       Exit::usage,  "--save-task", "a task has no place for --map with channels of several sounds", "take the channels of one of them"},
     {Msg::mapSoundNone,    Exit::usage,  "--map",                                               "it takes sound {text}, and the last one is {text}",                     "sounds count from 0"},
     {Msg::mapChannelNone,  Exit::usage,  "--map",                                               "it takes channel {text}, and the last one of {file} is {text}",         "channels count from 0"},
     {Msg::volumeSoundNone, Exit::usage,  "--volume a:{text}",                                   "the last sound of the output is {text}",                                 "sounds count from 0"},

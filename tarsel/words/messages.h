@@ -127,6 +127,7 @@ enum class Msg : unsigned short {
     mapWrong,
     mapLong,
     mapSounds,
+    mapNoTask,
     mapSoundNone,
     mapChannelNone,
     volumeSoundNone,

@@ -32,7 +32,8 @@ SoundFormat soundFormat(const PlanOptions& options, const SoundFormat& in) {
 }
 
 void takeStreams(JobPlan& plan, const PlanOptions& options) {
-    for (size_t input = 0; input < plan.inputs.size(); ++input)
+    for (size_t input = 0; input < plan.inputs.size(); ++input) {
+        if (plan.inputs[input].joined) continue;
         for (const int type : {qvVideoStream, qvAudioStream}) {
             if (unwanted(options, type) || (type == qvVideoStream && plan.output.kind == OutputKind::wav))
                 continue;
@@ -51,6 +52,7 @@ void takeStreams(JobPlan& plan, const PlanOptions& options) {
                 plan.streams.push_back(std::move(stream));
             }
         }
+    }
 }
 
 void checkKinds(JobPlan& plan, const PlanOptions& options) {
@@ -98,7 +100,7 @@ void warnOfUnused(JobPlan& plan, const PlanOptions& options) {
         return unwanted(options, type) && !input.streams(type).empty();
     };
     for (const JobInput& input : plan.inputs)
-        if (!isLeft(input, qvVideoStream) && !isLeft(input, qvAudioStream) &&
+        if (!input.joined && !input.joins && !isLeft(input, qvVideoStream) && !isLeft(input, qvAudioStream) &&
             std::none_of(plan.streams.begin(), plan.streams.end(),
                          [&](const auto& s) { return &plan.input(s) == &input; }))
             plan.warnings.push_back(lineOf(Msg::inputUnused, {input.name}));
@@ -180,7 +182,8 @@ JobPlan planJob(const PlanOptions& options, const OutputForm& output, std::vecto
 std::string planText(const JobPlan& plan) {
     std::string text;
     for (const JobInput& input : plan.inputs)
-        text += "input   " + inQuotes(input.name) + "  " + formatTime(input.duration) + "\n";
+        if (!input.joined)
+            text += "input   " + inQuotes(input.name) + "  " + formatTime(input.duration) + "\n";
     for (const PlannedStream& stream : plan.streams) {
         text += std::string("stream  ") + (stream.isVideo() ? "video " : "audio ") +
                 std::to_string(stream.part.stream) + " of " + inQuotes(plan.input(stream).name) + ", " +
