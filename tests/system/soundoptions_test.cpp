@@ -247,6 +247,17 @@ TEST_F(SoundOptions, WhatCanNotBeDoneIsRefused) {
     works({"transcode", "many.wav", "--normalize", "--samplerate", "48000", "-o", "ten.wav"});
 }
 
+// RF64 has no room for it in its header.
+TEST_F(SoundOptions, AChannelMaskThatIsLostIsNamed) {
+    for (const auto& [megabytes, lost] : {std::pair{6, false}, {36, true}}) {  // 0.9 and 5.4 GB of output
+        folder.write("take.wav", riff(wavChunk("fmt ", wavExtensible(1, 3, 8000, 16, 0xB)) +
+                                      wavChunk("data", std::string(size_t(megabytes) << 20, '\0'))));
+        const Outcome o = works({"transcode", "take.wav", "-o", "out.wav", "--dry-run", "--bits", "24",
+                                 "--samplerate", "768000"});
+        EXPECT_EQ(o.err.find("the output can't keep the places of its channels") != std::string::npos, lost);
+    }
+}
+
 TEST_F(SoundOptions, LoudnessMeasuresEveryFileThatItCan) {
     makeTone("tone.wav", 96000, 0.5);
     makeWav("empty.wav", 0);
