@@ -33,7 +33,7 @@ void check(const StoredTask& task) {
         if (use == TaskFileUse::filterReads) requireFile(name);
         return name;
     });
-    tell(Level::note, inQuotes(task.file()) + " is sound, and its inputs are there");
+    tell(Level::note, inQuotes(task.name()) + " is sound, and its inputs are there");
 }
 
 // A file, or all that is in a folder, under another name.
@@ -41,7 +41,7 @@ class Relink {
   public:
     // `rule`: OLD=NEW.
     Relink(const std::string& rule, const StoredTask& task)
-        : folder_(fs::absolute(task.file()).parent_path()) {
+        : folder_(fs::absolute(task.name()).parent_path()) {
         const size_t equals = rule.find('=');
         if (equals == std::string::npos || equals == 0 || equals + 1 == rule.size())
             throw failure(Msg::taskRelinkWrong, {"relink", rule});
@@ -81,13 +81,13 @@ void relink(const std::string& rule, const StoredTask& task, Signals& signals) {
     Relink change(rule, task);
     AnyDict state = task.raw();
     changeTaskFiles(state, [&](const std::string& name, TaskFileUse) { return change(name); });
-    if (change.count() == 0) throw failure(Msg::taskRelinkNothing, {task.file(), change.old()});
-    Outputs outputs(task.file(), "the task", {}, OutputPolicy(true));
+    if (change.count() == 0) throw failure(Msg::taskRelinkNothing, {task.name(), change.old()});
+    Outputs outputs(task.name(), "the task", {}, OutputPolicy(true));
     const Signals::Watch placing(signals, {.first = {}, .second = [&] { return outputs.leave(); }});
     const std::string reason = writeTask(state, outputs.begin("xml"));
-    if (!reason.empty()) throw writeFailure(task.file(), outputs.withFinalNames(reason));
+    if (!reason.empty()) throw writeFailure(task.name(), outputs.withFinalNames(reason));
     outputs.commit();
-    tell(Level::note, inQuotes(task.file()) + ": " + std::to_string(change.count()) +
+    tell(Level::note, inQuotes(task.name()) + ": " + std::to_string(change.count()) +
                           (change.count() == 1 ? " name changed" : " names changed"));
 }
 

@@ -77,6 +77,9 @@ void addTranscode(CommandLine& line, Signals& signals, const std::string& versio
                    "What to write; the extension says how. - is the standard output", "FILE");
     command.option("--format", job.format, "What to write, in the place of an extension: wav, raw, ...",
                    "EXT", outputFormats());
+    command.flag("--join", job.join,
+                 "The INPUTs are segments NAME[@FROM-TO], one after the other; A+B is read side by side");
+    command.list("--cut", job.cuts, "A part of the INPUTs; several are joined in this order", "FROM-TO");
     command.option("--raw", job.raw, "Format of a raw input: size=WxH,pixel=FORMAT,rate=R", "K=V,...");
     command.option("--from", job.from,
                    "First instant taken: SS.mmm, HH:MM:SS, 120f, HH:MM:SS:FF; -10 counts from the end",

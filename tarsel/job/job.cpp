@@ -8,7 +8,11 @@
 #include "tarsel/job/keptchunks.h"
 #include "tarsel/job/outputpipe.h"
 #include "tarsel/job/savedtask.h"
+#include "tarsel/job/task/joinplanner.h"
 #include "tarsel/job/task/taskplan.h"
+#include "tarsel/job/task/tasktext.h"
+#include "tarsel/sound/channelmap.h"
+#include "tarsel/source/joinedsound.h"
 #include "tarsel/words/messages.h"
 
 Job::Job(const JobOptions& options, Signals& signals)
@@ -16,7 +20,13 @@ Job::Job(const JobOptions& options, Signals& signals)
       signals_(signals),
       parts_{{}, {}, JobOutputs(options_), nullptr, nullptr},
       warnings_(options.warnings) {
+    if (options_.inputs.empty()) throw failure(Msg::inputMissing);
+    if (options_.joins()) {
+        joinInputs();
+        return;
+    }
     openInputs();
+    joinSounds();
     begin(planJob(options_, parts_.outputs.form(), readInputs()));
 }
 
@@ -42,23 +52,73 @@ void Job::begin(JobPlan plan) {
     parts_.outputs.claim(parts_.plan, filesRead(), *parts_.pipe);
 }
 
+// Next to a raw file there may be others, such as its sound.
+std::unique_ptr<Source> Job::openInput(const std::string& name) {
+    const bool isRaw = options_.inputs.size() == 1 || !Source::describesItself(name);
+    rawTaken_ |= isRaw;
+    auto source = std::make_unique<Source>(name, isRaw ? options_.raw : "");
+    source->selectAll();
+    return source;
+}
+
 void Job::openInputs() {
-    if (options_.inputs.empty()) throw failure(Msg::inputMissing);
-    // Next to a raw file there may be others, such as its sound.
-    const bool onlyOne = options_.inputs.size() == 1;
-    const auto isRaw = [&](const auto& name) { return onlyOne || !Source::describesItself(name); };
-    if (!options_.raw.empty() && std::none_of(options_.inputs.begin(), options_.inputs.end(), isRaw))
-        throw failure(Msg::rawNoInput);
-    for (const auto& name : options_.inputs) {
-        parts_.sources.push_back(std::make_unique<Source>(name, isRaw(name) ? options_.raw : ""));
-        parts_.sources.back()->selectAll();
-    }
+    for (const auto& name : options_.inputs) parts_.sources.push_back(openInput(name));
+    if (!options_.raw.empty() && !rawTaken_) throw failure(Msg::rawNoInput);
+}
+
+// The segments become a task, which reads them one after the other.
+void Job::joinInputs() {
+    JoinPlanner planner(options_, parts_.outputs.form(),
+                        [this](const std::string& name) { return openInput(name); });
+    planner.plan();
+    if (!options_.raw.empty() && !rawTaken_) throw failure(Msg::rawNoInput);
+    const auto pipe = makeOutputPipe(planner.whole(), options_.acceptPartial);
+    AnyDict encoder;
+    pipe->store(encoder);
+    parts_.stored = std::make_unique<StoredTask>(
+        joinedState(planner.join(), encoder, parts_.outputs.storedName()), planner.name());
+    parts_.stored->open();
+    parts_.sources = parts_.stored->sources();
+    parts_.pipe = parts_.stored->takePipe();
+    JobPlan plan = planTask(*parts_.stored, planner.whole().output, readInputs(), options_.acceptPartial);
+    plan.warnings = planner.whole().warnings;
+    plan.filterFiles.read = planner.files();
+    begin(std::move(plan));
 }
 
 std::vector<JobInput> Job::readInputs() const {
     std::vector<JobInput> inputs;
     for (const auto& source : parts_.sources) inputs.push_back(readInput(*source));
+    if (joined_) inputs.back().joined = true;
     return inputs;
+}
+
+// Where --map takes channels of several sounds, they become one sound of a further input.
+void Job::joinSounds() {
+    if (options_.sound.map.empty()) return;
+    const std::vector<int> sounds = parseChannelMap(options_.sound.map).sounds();
+    std::vector<JoinedSound::Part> all, parts;
+    std::vector<std::string> names;
+    for (const auto& source : parts_.sources)
+        for (int i = 0; i < source->decoder().nrStreams(qvAudioStream); ++i) {
+            if (std::binary_search(sounds.begin(), sounds.end(), static_cast<int>(all.size()))) {
+                parts.push_back({&source->decoder(), i});
+                names.push_back(source->name());
+            }
+            all.push_back({&source->decoder(), i});
+        }
+    // The plan refuses what is not there.
+    if (sounds.size() < 2 || parts.size() < sounds.size()) return;
+    const auto rateOf = [&](size_t part) {
+        return parts[part].decoder->getAudioParam(parts[part].stream, "samplerate").asInt32(0);
+    };
+    for (size_t i = 1; i < parts.size(); ++i)
+        if (rateOf(i) != rateOf(0))
+            throw failure(Msg::mapSounds, {std::to_string(sounds[i]), std::to_string(rateOf(i)),
+                                           std::to_string(sounds[0]), std::to_string(rateOf(0))});
+    parts_.sources.push_back(
+        std::make_unique<Source>(joined(names, " + "), std::make_unique<JoinedSound>(parts)));
+    joined_ = true;
 }
 
 // What filters read is an input as well.
@@ -66,7 +126,7 @@ std::vector<std::string> Job::filesRead() const {
     std::vector<std::string> files = parts_.plan.filterFiles.read;
     for (const auto& source : parts_.sources)
         files.insert(files.end(), source->files().begin(), source->files().end());
-    if (parts_.stored) files.push_back(parts_.stored->file());
+    if (parts_.stored && !options_.joins()) files.push_back(parts_.stored->name());
     return files;
 }
 
@@ -81,7 +141,7 @@ void Job::printPlan() {
         saveTask(parts_, options_, signals_);
         parts_.outputs.commitTask();
     }
-    printText(planText(parts_.plan));
+    printText((parts_.stored ? segmentsText(*parts_.stored) : "") + planText(parts_.plan));
     if (!options_.quiet) warnings_.show();
     if (!options_.quiet)
         for (const auto& line : parts_.plan.notes) tell(Level::note, line);

@@ -28,7 +28,10 @@ class Job {
 
   private:
     void begin(JobPlan plan);
+    std::unique_ptr<Source> openInput(const std::string& name);
     void openInputs();
+    void joinInputs();
+    void joinSounds();
     std::vector<JobInput> readInputs() const;
     std::vector<std::string> filesRead() const;
 
@@ -36,6 +39,8 @@ class Job {
     Signals& signals_;
     JobParts parts_;
     InputLengths lengths_;
+    bool rawTaken_ = false;  // --raw describes an input
+    bool joined_ = false;  // the last source
     Warnings warnings_;
 };
 

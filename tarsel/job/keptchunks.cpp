@@ -5,15 +5,19 @@
 
 namespace {
 
+constexpr long long kMostRiff = 0xFFFFFFFF - 80;  // bytes after the header
+
 WavPart partOf(const JobPlan& plan, const PlannedStream& stream) {
     WavPart part;
     part.samplerate = stream.sound.samplerate;
     part.channels = stream.sound.channels;
     part.bits = stream.sound.bits;
     part.changed = !stream.filters.empty();
+    const long long files = plan.output.splitChannels ? stream.sound.channels : 1;
+    part.isRf64 = stream.bytes(stream.expected) / files > kMostRiff;
     if (stream.part.whole) return part;
     const int rate = plan.source(stream).sound.samplerate;
-    part.first = stream.part.in.position(rate);
+    part.first = (stream.part.in + stream.skipped).position(rate);
     part.samples = stream.part.out.position(rate) - part.first;
     return part;
 }

@@ -19,10 +19,7 @@ bool keepsExactName(const JobParts& parts, const JobOptions& options) {
            options.output != stem + "." + form.extension(parts.plan.hasVideo());
 }
 
-}  // namespace
-
-void saveTask(JobParts& parts, const JobOptions& options, Signals& signals) {
-    if (!parts.outputs.hasTask()) return;
+AnyDict newState(const JobParts& parts, const JobOptions& options) {
     QvTask task;
     task.setEncoder(parts.pipe.get());
     for (const PlannedStream& s : parts.plan.streams)
@@ -30,12 +27,21 @@ void saveTask(JobParts& parts, const JobOptions& options, Signals& signals) {
             throw failure(Msg::taskFailed, {options.saveTask});
     if (const std::string name = parts.outputs.storedName(); !name.empty())
         parts.pipe->setFilename(Any(name.c_str()));
-    if (!options.post.empty()) task.setPostprocessCommand(options.post.c_str());
     const bool exact = keepsExactName(parts, options);
     if (exact) parts.pipe->getMuxer()->setParam("exactName", 1);
     AnyDict state;
     task.store(state);
     if (exact) parts.pipe->getMuxer()->setParam("exactName", 0);
+    return state;
+}
+
+}  // namespace
+
+void saveTask(JobParts& parts, const JobOptions& options, Signals& signals) {
+    if (!parts.outputs.hasTask()) return;
+    AnyDict state =
+        parts.stored ? static_cast<const AnyDict&>(parts.stored->state()) : newState(parts, options);
+    if (!options.post.empty()) state.set("postProcess", options.post.c_str());
     const Signals::Watch storing(signals, {.first = {}, .second = [&] { return parts.outputs.leave(); }});
     if (options.relative)
         makeRelative(state, fs::path(options.saveTask).parent_path().string());

@@ -30,12 +30,8 @@ std::optional<int> number(std::string_view text) {
 }
 
 // "3", a channel of the first sound, or "a:1.3".
-struct Input {
-    int sound = 0, channel = 0;
-};
-
-std::optional<Input> input(std::string_view text) {
-    Input in;
+std::optional<ChannelMap::Input> input(std::string_view text) {
+    ChannelMap::Input in;
     if (text.starts_with(kSound)) {
         const size_t dot = text.find('.');
         const auto sound = number(text.substr(kSound.size(), dot - std::min(dot, kSound.size())));
@@ -55,11 +51,24 @@ bool ChannelMap::copies() const {
     return std::all_of(rows.begin(), rows.end(), [](const auto& row) { return row.size() < 2; });
 }
 
-AnyVector ChannelMap::matrix() const {
+std::vector<int> ChannelMap::sounds() const {
+    std::vector<int> all;
+    for (const auto& row : rows)
+        for (const Input& in : row) all.push_back(in.sound);
+    std::sort(all.begin(), all.end());
+    all.erase(std::unique(all.begin(), all.end()), all.end());
+    return all.empty() ? std::vector<int>{0} : all;
+}
+
+AnyVector ChannelMap::matrix(const std::vector<int>& first) const {
+    const std::vector<int> parts = sounds();
     AnyVector all;
     for (const auto& row : rows) {
         AnyVector sources;
-        for (const int channel : row) sources.append(Any(AnyDict("channel", channel)));
+        for (const Input& in : row) {
+            const auto part = std::lower_bound(parts.begin(), parts.end(), in.sound) - parts.begin();
+            sources.append(Any(AnyDict("channel", first.at(static_cast<size_t>(part)) + in.channel)));
+        }
         all.append(row.empty() ? Any(0) : Any(sources));
     }
     return all;
@@ -68,21 +77,16 @@ AnyVector ChannelMap::matrix() const {
 ChannelMap parseChannelMap(const std::string& text) {
     const std::string most = std::to_string(ChannelMap::most);
     ChannelMap map;
-    std::optional<int> sound;
     for (const std::string_view out : split(text, ',')) {
-        std::vector<int>& row = map.rows.emplace_back();
+        std::vector<ChannelMap::Input>& row = map.rows.emplace_back();
         if (out == "-") continue;
         for (const std::string_view in : split(out, '+')) {
             const auto source = input(in);
             if (!source) throw failure(Msg::mapWrong, {text});
-            if (sound && *sound != source->sound)
-                throw failure(Msg::mapSounds, {std::to_string(*sound), std::to_string(source->sound)});
-            sound = source->sound;
-            row.push_back(source->channel);
+            row.push_back(*source);
         }
         if (row.size() > ChannelMap::most) throw failure(Msg::mapLong, {"the mean of more inputs", most});
     }
     if (map.rows.size() > ChannelMap::most) throw failure(Msg::mapLong, {"more channels", most});
-    map.sound = sound.value_or(0);
     return map;
 }

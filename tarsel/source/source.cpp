@@ -137,11 +137,17 @@ Source::Source(const std::string& spec, const std::string& raw) : name_(spec) {
     open_ = decoder_.get();
 }
 
+Source::Source(const std::string& name, QvDecodePipe& decoder)
+    : name_(name), isFile_(false), open_(&decoder) {}
+
 Source::Source(QvDecodePipe& decoder) : open_(&decoder) {
     name_ = decoder.QvCodec::getParam("filename").toString().asString("");
     isFile_ = !decoder.QvCodec::getParam("isMeta").isTrue();
     if (isFile_) files_.push_back(name_);
 }
+
+Source::Source(const std::string& name, std::unique_ptr<QvDecodePipe> decoder)
+    : name_(name), isFile_(false), decoder_(std::move(decoder)) {}
 
 bool Source::describesItself(const std::string& spec) {
     if (isGenerator(spec)) return true;

@@ -15,6 +15,10 @@ class Source {
     Source(const std::string& spec, const std::string& raw);
     // One that is open already; it has to outlive this.
     explicit Source(QvDecodePipe& decoder);
+    // The same for a decoder that reads others.
+    Source(const std::string& name, QvDecodePipe& decoder);
+    // What others are read through.
+    Source(const std::string& name, std::unique_ptr<QvDecodePipe> decoder);
 
     // Whether an input of this name needs no format from outside: the generator, or an extension with a
     // decoder.

@@ -55,8 +55,9 @@ std::string carryWavChunks(const Source& source, int stream, const WavPart& part
     const bool said = mask.isInt() && sameChannels && mask.toInt64() != 0 &&
                       !(part.channels == 1 && mask.toInt64() == kMono) &&
                       !(part.channels == 2 && mask.toInt64() == kStereo);
-    if (said && output) output->setParam("channelMask", mask);
-    if (said && !output) add(lost, "the places of its channels");
+    const bool keeps = output && !part.isRf64;
+    if (said && keeps) output->setParam("channelMask", mask);
+    if (said && !keeps) add(lost, "the places of its channels");
     return listed(lost);
 }
 

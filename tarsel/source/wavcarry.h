@@ -13,6 +13,7 @@ struct WavPart {
     long long samples = -1;  // of the source; negative: all of them
     int samplerate = 0, channels = 0, bits = 0;
     bool changed = false;  // by filters
+    bool isRf64 = false;   // the file is so large that its header has no room for a channel mask
 };
 
 // Gives words and marks of the source to the stream that writes the WAV; null for an output that has no room

@@ -66,6 +66,45 @@ TEST_F(SoundOptions, ChannelsAreMapped) {
     EXPECT_TRUE(values("out.wav") == swapped);
 }
 
+// Channels of several sounds go into one, whatever their lengths and widths.
+TEST_F(SoundOptions, SoundsAreJoinedByTheMap) {
+    makeWav("left.wav", 70000, 1, 16, 48000);
+    makeWav("right.wav", 5000, 2, 24, 48000);
+    makeWav("old.wav", 300, 1, 8, 48000);
+    makeWav("slow.wav", 300, 1, 16, 44100);
+    const Words job{"transcode", "left.wav", "right.wav", "old.wav", "--dither",
+                    "none",      "-y",       "-o",        "out.wav"};
+    works(job + Words{"--map", "a:0.0,a:1.1,a:2.0"});
+    const std::string left = wavPart(contents("left.wav"), "data"),
+                      out = wavPart(contents("out.wav"), "data"),
+                      right = wavPart(contents("right.wav"), "data"),
+                      old = wavPart(contents("old.wav"), "data");
+    std::string wanted;
+    for (size_t i = 0; i < 70000; ++i) {
+        wanted += std::string(1, '\0') + left.substr(2 * i, 2);
+        wanted += i < 5000 ? right.substr(6 * i + 3, 3) : std::string(3, '\0');
+        wanted += std::string(2, '\0') + (i < 300 ? static_cast<char>(old[i] ^ 0x80) : '\0');
+    }
+    EXPECT_TRUE(out == wanted);
+    works(job + Words{"--map", "a:0.0+a:2.0", "--bits", "16", "--from", "0.001"});
+    const std::string mean = wavPart(contents("out.wav"), "data");
+    ASSERT_EQ(mean.size(), (70000u - 48) * 2);
+    for (size_t i = 48; i < 1000; ++i) {
+        const int a = static_cast<int16_t>(leNumber(left, 2 * i, 2));
+        const int b = i < 300 ? (static_cast<int>(leNumber(old, i, 1)) - 128) * 256 : 0;
+        ASSERT_EQ(static_cast<int16_t>(leNumber(mean, 2 * (i - 48), 2)), (a + b) >> 1) << i;
+    }
+    makeYuv("clip.yuv", 25);
+    works(asYuv({"transcode", "clip.yuv", "left.wav", "old.wav", "--map", "a:1.0,a:0.0", "-o", "film.yuv"}));
+    EXPECT_EQ(wavPart(contents("film.wav"), "data").size(), 48000u * 4);
+    fails(2, {"transcode", "left.wav", "slow.wav", "--map", "0,a:1.0", "-o", "no.wav"},
+          {"--map: sound 1 has another rate (44100 Hz) than sound 0 (48000 Hz)"});
+    fails(2,
+          {"transcode", "left.wav", "old.wav", "--map", "0,a:1.0", "-o", "no.wav", "--save-task", "no.xml"},
+          {"--save-task: a task has no place for --map"});
+    fails(2, {"transcode", "left.wav", "old.wav", "--map", "0,a:2.0", "-o", "no.wav"}, {"it takes sound 2"});
+}
+
 // All of the sound is there, later or earlier, with and without a picture.
 TEST_F(SoundOptions, DelaysMoveTheSound) {
     makeWav("take.wav", 24000, 2, 16, 48000);
@@ -206,6 +245,17 @@ TEST_F(SoundOptions, WhatCanNotBeDoneIsRefused) {
     const std::string in = wavPart(contents("crowd.wav"), "data"), out = wavPart(contents("two.wav"), "data");
     EXPECT_EQ(out.substr(0, 4), in.substr(78, 2) + in.substr(0, 2));
     works({"transcode", "many.wav", "--normalize", "--samplerate", "48000", "-o", "ten.wav"});
+}
+
+// RF64 has no room for it in its header.
+TEST_F(SoundOptions, AChannelMaskThatIsLostIsNamed) {
+    for (const auto& [megabytes, lost] : {std::pair{6, false}, {36, true}}) {  // 0.9 and 5.4 GB of output
+        folder.write("take.wav", riff(wavChunk("fmt ", wavExtensible(1, 3, 8000, 16, 0xB)) +
+                                      wavChunk("data", std::string(size_t(megabytes) << 20, '\0'))));
+        const Outcome o = works({"transcode", "take.wav", "-o", "out.wav", "--dry-run", "--bits", "24",
+                                 "--samplerate", "768000"});
+        EXPECT_EQ(o.err.find("the output can't keep the places of its channels") != std::string::npos, lost);
+    }
 }
 
 TEST_F(SoundOptions, LoudnessMeasuresEveryFileThatItCan) {

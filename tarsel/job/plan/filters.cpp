@@ -1,14 +1,40 @@
 #include "tarsel/job/plan/filters.h"
 
 #include <algorithm>
+#include <cmath>
 
 #include "tarsel/job/plan/jobplan.h"
 #include "tarsel/words/messages.h"
+#include "tarsel/words/timespec.h"
 
-FilterPlanner::FilterPlanner(JobPlan& plan, const EffectOptions& options) : plan_(plan), options_(options) {
+namespace {
+
+// The options with which a picture gets a format. One of another shape keeps its own, between bars.
+EffectOptions leadingTo(const PictureFormat& format, const PictureFormat& from,
+                        const EffectOptions& options) {
+    constexpr double alike = 0.01;
+    EffectOptions other = options;
+    const std::string size = std::to_string(format.width) + "x" + std::to_string(format.height);
+    const bool sameShape = std::abs(from.aspect - format.aspect) <= alike * format.aspect;
+    const bool shaped = !options.size.empty() || !options.fit.empty() || !options.crop.empty() || sameShape;
+    if (options.fit.empty()) other.size = shaped ? size : "";
+    if (!shaped) other.fit = size + ",bars";
+    other.rate = formatRate(format.rate);
+    other.pixel = fourccText(format.fourcc);
+    return other;
+}
+
+}  // namespace
+
+FilterPlanner::FilterPlanner(JobPlan& plan, const EffectOptions& options,
+                             const std::vector<PictureFormat>& known)
+    : plan_(plan), options_(options) {
     for (PlannedStream& stream : plan.streams) {
         if (!stream.isVideo()) continue;
-        pictures_.emplace_back(options, stream.picture, plan.output.kind == OutputKind::pictures);
+        const auto number = static_cast<size_t>(stream.number);
+        if (number < known.size()) towards_.push_back(leadingTo(known[number], stream.picture, options));
+        pictures_.emplace_back(number < known.size() ? towards_.back() : options, stream.picture,
+                               plan.output.kind == OutputKind::pictures);
         stream.picture = pictures_.back().out();
     }
 }

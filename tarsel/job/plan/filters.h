@@ -1,6 +1,7 @@
 // Which filters each picture of a job passes, and the format in which it comes out of them.
 #pragma once
 
+#include <list>
 #include <vector>
 
 #include "tarsel/picture/picture.h"
@@ -10,9 +11,10 @@ struct PlannedStream;
 
 class FilterPlanner {
   public:
-    // Sets the format of each video stream, which the lengths depend on. Both have to outlive the planner.
-    // Throws Failure for options that do not fit a stream.
-    FilterPlanner(JobPlan& plan, const EffectOptions& options);
+    // Sets the format of each video stream, which the lengths depend on: the one that is `known` for its
+    // number, or what the options make of its source. Plan and options have to outlive the planner. Throws
+    // Failure for options that do not fit a stream.
+    FilterPlanner(JobPlan& plan, const EffectOptions& options, const std::vector<PictureFormat>& known = {});
     // Sets the filters of all pictures and what they read and write. The lengths have to be known. Throws
     // Failure for filters that can't be used, or that have nothing to work on.
     void plan();
@@ -23,5 +25,6 @@ class FilterPlanner {
 
     JobPlan& plan_;
     const EffectOptions& options_;
+    std::list<EffectOptions> towards_;      // those that lead to known formats
     std::vector<PictureEffects> pictures_;  // of the video streams, by their numbers
 };

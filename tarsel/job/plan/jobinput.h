@@ -31,6 +31,8 @@ struct JobInput {
     std::string damage;    // see Source::damage
     double duration = -1;  // seconds of the longest stream; negative when unknown
     std::vector<InputStream> video, audio;
+    bool joined = false;  // its sound is those of other inputs, side by side, as --map takes them
+    bool joins = false;   // there
 
     const std::vector<InputStream>& streams(int type) const { return type == qvVideoStream ? video : audio; }
     // Of the first video stream.

@@ -22,8 +22,9 @@ SoundFormat soundFormat(const PlanOptions& options, const SoundFormat& in) {
             options.bits.value_or(in.bits)};
 }
 
-void takeStreams(JobPlan& plan, const PlanOptions& options) {
-    for (size_t input = 0; input < plan.inputs.size(); ++input)
+void takeStreams(JobPlan& plan, const PlanOptions& options, const KnownFormats* known) {
+    for (size_t input = 0; input < plan.inputs.size(); ++input) {
+        if (plan.inputs[input].joined) continue;
         for (const int type : {qvVideoStream, qvAudioStream}) {
             if (unwanted(options, type) || (type == qvVideoStream && plan.output.kind == OutputKind::wav))
                 continue;
@@ -38,10 +39,14 @@ void takeStreams(JobPlan& plan, const PlanOptions& options) {
                 stream.part.input = static_cast<int>(input);
                 stream.part.stream = static_cast<int>(i);
                 stream.picture = streams[i].picture;
-                stream.sound = soundFormat(options, streams[i].sound);
+                const auto number = static_cast<size_t>(stream.number);
+                stream.sound = known && number < known->sounds.size()
+                                   ? known->sounds[number]
+                                   : soundFormat(options, streams[i].sound);
                 plan.streams.push_back(std::move(stream));
             }
         }
+    }
 }
 
 void checkKinds(JobPlan& plan, const PlanOptions& options) {
@@ -89,7 +94,7 @@ void warnOfUnused(JobPlan& plan, const PlanOptions& options) {
         return unwanted(options, type) && !input.streams(type).empty();
     };
     for (const JobInput& input : plan.inputs)
-        if (!isLeft(input, qvVideoStream) && !isLeft(input, qvAudioStream) &&
+        if (!input.joined && !input.joins && !isLeft(input, qvVideoStream) && !isLeft(input, qvAudioStream) &&
             std::none_of(plan.streams.begin(), plan.streams.end(),
                          [&](const auto& s) { return &plan.input(s) == &input; }))
             plan.warnings.push_back(lineOf(Msg::inputUnused, {input.name}));
@@ -153,20 +158,26 @@ void checkDamage(JobPlan& plan, bool acceptPartial) {
     }
 }
 
-JobPlan planJob(const PlanOptions& options, const OutputForm& output, std::vector<JobInput> inputs) {
+void checkOutput(JobPlan& plan, const PlanOptions& options) {
+    checkKinds(plan, options);
+    checkCounts(plan);
+    checkChannels(plan, options);
+}
+
+JobPlan planJob(const PlanOptions& options, const OutputForm& output, std::vector<JobInput> inputs,
+                const KnownFormats* known) {
     JobPlan plan;
     plan.output = output;
     plan.inputs = std::move(inputs);
     checkDamage(plan, options.acceptPartial);
-    takeStreams(plan, options);
+    takeStreams(plan, options, known);
     EffectOptions effects = options.effects;
     effects.pixel = output.pixel;
-    FilterPlanner filters(plan, effects);
-    checkKinds(plan, options);
+    FilterPlanner filters(plan, effects, known ? known->pictures : std::vector<PictureFormat>());
+    if (!known) checkOutput(plan, options);
+    if (plan.streams.empty()) throw failure(Msg::segmentNoStreams, {plan.inputs.front().name});
     SoundPlanner sounds(plan, options);
-    checkCounts(plan);
-    checkChannels(plan, options);
-    warnOfUnused(plan, options);
+    if (!known) warnOfUnused(plan, options);
     planPoints(plan, {options.from, options.to, options.duration});
     sounds.planDelays();
     planEnds(plan, options.shortest, options.longest);
@@ -180,7 +191,8 @@ JobPlan planJob(const PlanOptions& options, const OutputForm& output, std::vecto
 std::string planText(const JobPlan& plan) {
     std::string text;
     for (const JobInput& input : plan.inputs)
-        text += "input   " + inQuotes(input.name) + "  " + formatTime(input.duration) + "\n";
+        if (!input.joined)
+            text += "input   " + inQuotes(input.name) + "  " + formatTime(input.duration) + "\n";
     for (const PlannedStream& stream : plan.streams) {
         text += std::string("stream  ") + (stream.isVideo() ? "video " : "audio ") +
                 std::to_string(stream.part.stream) + " of " + inQuotes(plan.input(stream).name) + ", " +

@@ -64,8 +64,19 @@ struct JobPlan {
     long long bytes() const;  // that are written, without headers
 };
 
-// Throws Failure for what can't be done. The engine has to be started, for its filters.
-JobPlan planJob(const PlanOptions& options, const OutputForm& output, std::vector<JobInput> inputs);
+// The formats that the streams of an output have already, by their numbers.
+struct KnownFormats {
+    std::vector<PictureFormat> pictures;
+    std::vector<SoundFormat> sounds;
+};
+
+// Throws Failure for what can't be done. The engine has to be started, for its filters. With `known` it plans
+// one of several segments, whose streams get these formats as far as they go; it may lack picture or sound,
+// and checkOutput is called for the whole.
+JobPlan planJob(const PlanOptions& options, const OutputForm& output, std::vector<JobInput> inputs,
+                const KnownFormats* known = nullptr);
+// Whether the output can hold the streams of the plan; sets its kind where they decide it. Throws Failure.
+void checkOutput(JobPlan& plan, const PlanOptions& options);
 
 // Throws Failure for a damaged input, unless what is there of it is to be taken: then it is a warning.
 void checkDamage(JobPlan& plan, bool acceptPartial);

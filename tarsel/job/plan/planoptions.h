@@ -20,9 +20,13 @@ enum class OutputKind {
 };
 
 struct PlanOptions {
+    bool joins() const { return join || !cuts.empty(); }
+
     std::vector<std::string> inputs;
     std::string output, format, muxer, saveTask;
     std::string from, to, duration;
+    bool join = false;               // the inputs are segments, one after the other
+    std::vector<std::string> cuts;   // parts of the inputs, one after the other
     std::optional<OutputKind> kind;  // of a stored task's output, whatever its name says
     EffectOptions effects;
     SoundOptions sound;

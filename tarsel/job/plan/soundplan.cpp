@@ -4,7 +4,6 @@
 #include <cstdio>
 
 #include "tarsel/job/plan/jobplan.h"
-#include "tarsel/sound/channelmap.h"
 #include "tarsel/words/messages.h"
 #include "tarsel/words/timespec.h"
 
@@ -82,25 +81,48 @@ void SoundPlanner::checkOptions() const {
         throw failure(Msg::optionsExclude, {"--delay", std::string("--filter ") + kDelay});
 }
 
-void SoundPlanner::takeMap() {
-    const ChannelMap map = parseChannelMap(options_.sound.map);
-    const int sounds = plan_.count(qvAudioStream);
-    if (map.sound >= sounds)
-        throw failure(Msg::mapSoundNone, {std::to_string(map.sound), std::to_string(sounds - 1)});
-    std::erase_if(plan_.streams, [&](const auto& s) { return !s.isVideo() && s.number != map.sound; });
-    const auto found =
-        std::find_if(plan_.streams.begin(), plan_.streams.end(), [](const auto& s) { return !s.isVideo(); });
-    PlannedStream& stream = *found;
-    const int channels = plan_.source(stream).sound.channels;
+// The sounds of a map, which there are, and the channels that each has.
+void SoundPlanner::checkMap(const ChannelMap& map, const std::vector<const PlannedStream*>& sounds) const {
     for (const auto& row : map.rows)
-        for (const int channel : row)
+        for (const auto& [sound, channel] : row) {
+            if (sound >= static_cast<int>(sounds.size()))
+                throw failure(Msg::mapSoundNone, {std::to_string(sound), std::to_string(sounds.size() - 1)});
+            const PlannedStream& stream = *sounds[static_cast<size_t>(sound)];
+            const int channels = plan_.source(stream).sound.channels;
             if (channel >= channels)
                 throw failure(Msg::mapChannelNone, {std::to_string(channel), plan_.input(stream).name,
                                                     std::to_string(channels - 1)});
+        }
+}
+
+void SoundPlanner::takeMap() {
+    const ChannelMap map = parseChannelMap(options_.sound.map);
+    std::vector<const PlannedStream*> sounds;
+    for (const PlannedStream& stream : plan_.streams)
+        if (!stream.isVideo()) sounds.push_back(&stream);
+    checkMap(map, sounds);
+    const std::vector<int> parts = map.sounds();
+    std::vector<int> first;
+    int channels = 0;
+    for (const int part : parts) {
+        const PlannedStream& stream = *sounds[static_cast<size_t>(part)];
+        plan_.inputs[static_cast<size_t>(stream.part.input)].joins = parts.size() > 1;
+        first.push_back(channels);
+        channels += plan_.source(stream).sound.channels;
+    }
+    PlannedStream stream = *sounds[static_cast<size_t>(parts.front())];
+    if (parts.size() > 1) {
+        if (!options_.saveTask.empty()) throw failure(Msg::mapNoTask);
+        stream.part.input = static_cast<int>(plan_.inputs.size()) - 1;
+        stream.part.stream = 0;
+        if (!options_.bits) stream.sound.bits = plan_.source(stream).sound.bits;
+    }
     stream.number = 0;
     stream.sound.channels = static_cast<int>(map.rows.size());
-    stream.channelMap = map.matrix();
+    stream.channelMap = map.matrix(first);
     mapCopies_ = map.copies();
+    std::erase_if(plan_.streams, [](const auto& s) { return !s.isVideo(); });
+    plan_.streams.push_back(std::move(stream));
 }
 
 void SoundPlanner::planDelays() {

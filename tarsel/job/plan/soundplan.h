@@ -2,7 +2,10 @@
 // converted.
 #pragma once
 
+#include <vector>
+
 #include "tarsel/job/plan/planoptions.h"
+#include "tarsel/sound/channelmap.h"
 #include "tarsel/sound/soundeffects.h"
 
 struct JobPlan;
@@ -26,6 +29,7 @@ class SoundPlanner {
 
   private:
     void takeMap();
+    void checkMap(const ChannelMap& map, const std::vector<const PlannedStream*>& sounds) const;
     void checkOptions() const;
     void planDelay(PlannedStream& stream) const;
     void planFilters(PlannedStream& stream) const;

@@ -20,20 +20,9 @@ bool isDivisible(const std::string& name) {
     return module && module->getAttr("divisible").isTrue();
 }
 
-// False where nothing is left to do.
-bool divideFade(QvCodec& filter, const SegmentPlace& place) {
-    const int in = place.index == 0 ? filter.getParam("fade_in").asInt32(0) : 0;
-    const int out = place.index + 1 == place.count ? filter.getParam("fade_out").asInt32(0) : 0;
-    if (std::max(in, out) > place.frames)
-        throw failure(Msg::fadeTooLong, {std::to_string(std::max(in, out)), std::to_string(place.frames)});
-    filter.setParam("fade_in", in);
-    filter.setParam("fade_out", out);
-    filter.setParam("frames_count", static_cast<int>(place.frames));
-    return in > 0 || out > 0;
-}
-
 // The clock of the texts begins at the start of the output.
 void moveSubtitles(QvCodec& filter, const SegmentPlace& place) {
+    if (place.ofCuts) return;
     const QvRatio rate = place.rate.rate();
     const double ms = static_cast<double>(place.first - place.before) * 1000.0 * rate.den / rate.num;
     filter.setParam("delay", filter.getParam("delay").toDouble() + ms);
@@ -47,36 +36,22 @@ void moveTimecode(QvCodec& filter, const SegmentPlace& place) {
     filter.setParam("startOffset", static_cast<int>(offset - place.before));
 }
 
-// False for a filter that goes.
-bool divide(QvCodec& filter, const SegmentPlace& place) {
-    const std::string name = filter.name();
-    if (name == "videofade") return divideFade(filter, place);
-    if (name == "subtitle") {
-        if (!place.ofCuts) moveSubtitles(filter, place);
-        return true;
-    }
-    if (name == "timecode") {
-        moveTimecode(filter, place);
-        return true;
-    }
-    if (!isDivisible(name)) throw failure(Msg::filterNotDivided, {name});
-    return true;
-}
-
 }  // namespace
 
-void divideFilters(FiltersState& filters, const SegmentPlace& place) {
+void requireDivisible(const std::string& filter) {
+    if (!isDivisible(filter)) throw failure(Msg::filterNotDivided, {filter});
+}
+
+void moveTexts(FiltersState& filters, const SegmentPlace& place) {
     const AnyVector names = filters.names();
     for (int i = 0; i < filters.count(); ++i) {
-        const std::unique_ptr<QvCodec> filter(qv_registry()->newCodec(names.at(i).asString("")));
-        if (!filter) continue;  // refused where the segment was planned
+        const std::string name = names.at(i).asString("");
+        if (name != "subtitle" && name != "timecode") continue;
+        const std::unique_ptr<QvCodec> filter(qv_registry()->newCodec(name.c_str()));
         AnyDict state = filters.filterAt(i);
-        if (!state.get("_on").isTrue()) continue;
         filter->restore(state);
-        const bool stays = divide(*filter, place);
+        name == "subtitle" ? moveSubtitles(*filter, place) : moveTimecode(*filter, place);
         filter->store(state);
-        state.set("_on", stays ? 1 : 0);
         filters.setFilterAt(i, state);
     }
-    filters.removeInactive();
 }

@@ -40,12 +40,12 @@ class StateBuilder {
 
     AnyDict build(const AnyDict& encoder, const std::string& output) {
         std::vector<AnyVector> sources(streams_.size());
-        SegmentPlace place{.count = static_cast<int>(join_.segments.size()), .ofCuts = join_.ofCuts};
+        SegmentPlace place;
+        place.ofCuts = join_.ofCuts;
         for (const JoinedSegment& segment : join_.segments) {
             for (size_t i = 0; i < streams_.size(); ++i)
                 sources[i].append(sourceOf(segment, streams_[i], place));
             place.before += lengthInFrames(segment);
-            ++place.index;
         }
         AnyVector streams;
         for (size_t i = 0; i < streams_.size(); ++i)
@@ -80,10 +80,9 @@ class StateBuilder {
         AnyDict source("file", inputOf(segment, *own).get("filename"));
         source.set("stream", Any(Pair(own->type, own->part.stream)));
         PlannedStream divided = *own;
-        place.frames = own->expected;
         place.first = own->isVideo() ? own->part.in.position(own->picture.rate) : 0;
         place.rate = own->picture.rate;
-        divideFilters(divided.filters, place);
+        moveTexts(divided.filters, place);
         source.set("process", static_cast<const AnyDict&>(divided.params()));
         return source;
     }

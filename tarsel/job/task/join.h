@@ -24,6 +24,5 @@ struct Join {
     std::vector<PlannedStream> streams() const;
 };
 
-// `encoder`: the stored output. Where a segment lacks a stream, a generated one is black or silent. Throws
-// Failure for a filter that can't be divided over segments.
+// `encoder`: the stored output. Where a segment lacks a stream, a generated one is black or silent.
 AnyDict joinedState(const Join& join, const AnyDict& encoder, const std::string& output);

@@ -68,7 +68,7 @@ void makeRelative(AnyDict& state, const std::string& folder) {
     });
 }
 
-StoredTask::StoredTask(const std::string& file) : file_(file) {
+StoredTask::StoredTask(const std::string& file) : name_(file) {
     requireTask(file);
     Any root, version;
     if (XmlParser::restoreDict(Any(file.c_str()), raw_, root, version) != QvStatus::ok)
@@ -77,6 +77,14 @@ StoredTask::StoredTask(const std::string& file) : file_(file) {
     AnyDict state = raw_;
     changeTaskFiles(state, [&](const std::string& name, TaskFileUse) { return fromFolder(name, folder); });
     state_ = QvTaskState(state);
+}
+
+StoredTask::StoredTask(const AnyDict& state, const std::string& name) : name_(name) {
+    const std::unique_ptr<XmlNode, void (*)(XmlNode*)> node(new XmlNode(kClass), XmlNode::deleteTree);
+    XmlTrans trans;
+    trans.DictToXml(state, node.get());
+    trans.XmlToDict(node.get(), raw_);
+    state_ = QvTaskState(raw_);
 }
 
 StoredTask::~StoredTask() {
@@ -99,27 +107,35 @@ std::string StoredTask::output() const { return state_.outputFilename().toString
 
 std::string StoredTask::postProcess() const { return state_.postprocessCommand().toString().asString(""); }
 
+bool StoredTask::isJoin() const { return state_.nrSegments() != 1 || !state_.isSegmentEnabled(0); }
+
 void StoredTask::open() {
     for (const std::string& name : inputs()) requireInput(name);
     OpenReport report;
     QvEncodePipe* pipe = nullptr;
     Any error;
     try {
-        task_.reset(QvTask::fromState(state_, decoders_, &pipe, 0, &report, &error));
+        constexpr int options = QvBatchTask::skipDisabled | QvBatchTask::everySegmentOpens;
+        if (isJoin())
+            task_.reset(QvBatchTask::fromState(state_, decoders_, &pipe, options, &report, &error));
+        else
+            task_.reset(QvTask::fromState(state_, decoders_, &pipe, 0, &report, &error));
     } catch (const QvMemoryFailure&) {
         throw;
     } catch (const QvException& broken) {
-        if (report.file.empty()) throw failure(Msg::taskRefused, {file_, broken.what()});
+        if (report.file.empty()) throw failure(Msg::taskRefused, {name_, broken.what()});
     }
     pipe_.reset(pipe);
     if (!report.file.empty()) throw failure(Msg::inputRefused, {report.file, report.reason});
-    if (!task_) throw failure(Msg::taskRefused, {file_, error.toString().asString("it can't be restored")});
+    if (!task_) throw failure(Msg::taskRefused, {name_, error.toString().asString("it can't be restored")});
     task_->setPostprocessCommand(Any());  // a run of the engine would run it
 }
 
 std::vector<std::unique_ptr<Source>> StoredTask::sources() const {
     std::vector<std::unique_ptr<Source>> sources;
     for (QvDecodePipe* const decoder : task_->decoders())
-        sources.push_back(std::make_unique<Source>(*decoder));
+        sources.push_back(std::string_view(decoder->name()) == "batchdec"
+                              ? std::make_unique<Source>(name_, *decoder)
+                              : std::make_unique<Source>(*decoder));
     return sources;
 }

@@ -13,11 +13,15 @@ class StoredTask {
   public:
     // Reads and checks the file. Relative names in it count from its folder. Throws Failure.
     explicit StoredTask(const std::string& file);
+    // A state that was just made, as it is when it has been stored and read again: numbers with a point have
+    // six decimal places. `name`: for messages.
+    StoredTask(const AnyDict& state, const std::string& name);
     StoredTask(const StoredTask&) = delete;
     StoredTask& operator=(const StoredTask&) = delete;
     ~StoredTask();
 
-    const std::string& file() const { return file_; }
+    // Of the file, for the first of these.
+    const std::string& name() const { return name_; }
     // As the file has it, but with absolute names.
     const QvTaskState& state() const { return state_; }
     // As it is, without another folder's names in it.
@@ -29,6 +33,9 @@ class StoredTask {
     // The command that runs afterwards, with its placeholders; "" for none.
     std::string postProcess() const;
 
+    // Whether it has several segments, or one that is switched off.
+    bool isJoin() const;
+
     // Opens the inputs and makes the output, which opens nothing yet. The task has no command for afterwards
     // then: who wants it runs postProcess(). Throws Failure.
     void open();
@@ -39,7 +46,7 @@ class StoredTask {
     std::unique_ptr<QvEncodePipe> takePipe() { return std::move(pipe_); }
 
   private:
-    std::string file_;
+    std::string name_;
     AnyDict raw_;
     QvTaskState state_;
     QvDPipeList decoders_;

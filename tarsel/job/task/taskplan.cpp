@@ -108,7 +108,7 @@ JobPlan planTask(const StoredTask& task, const OutputForm& output, std::vector<J
     const QvDPipeList& decoders = task.task().decoders();
     for (const TransLink* const link : task.task().links())
         plan.streams.push_back(plannedStream(plan, *link, decoders.indexOf(link->decoder())));
-    if (plan.streams.empty()) throw failure(Msg::taskRefused, {task.file(), "nothing feeds its output"});
+    if (plan.streams.empty()) throw failure(Msg::taskRefused, {task.name(), "nothing feeds its output"});
     planFrames(plan);
     planSamples(plan);
     return plan;

@@ -57,7 +57,7 @@ Json describeState(const StoredTask& task) {
     const QvTaskState& state = task.state();
     const QvEncodePipeState encoder = state.encoder();
     Json object = Json::object();
-    object["task"] = jsonText(task.file());
+    object["task"] = jsonText(task.name());
     object["enabled"] = state.isEnabled();
     object["inputs"] = Json::array();
     for (const Any& entry : state.inputFiles()) {
@@ -109,7 +109,22 @@ std::string sourceLines(const Json& source) {
     return text;
 }
 
+std::string segmentLines(const Json& segments) {
+    std::string text;
+    for (size_t s = 0; s < segments.size(); ++s) {
+        const Json& segment = segments[s];
+        if (segments.size() > 1)
+            text += "segment  " + std::to_string(s + 1) + (segment["enabled"] ? "" : ", switched off") + "\n";
+        for (const Json& source : segment["sources"]) text += sourceLines(source);
+    }
+    return text;
+}
+
 }  // namespace
+
+std::string segmentsText(const StoredTask& task) {
+    return task.isJoin() ? segmentLines(describeState(task)["segments"]) : "";
+}
 
 std::string taskJson(const StoredTask& task) { return describeState(task).dump(2) + "\n"; }
 
@@ -118,12 +133,7 @@ std::string taskText(const StoredTask& task) {
     std::string text;
     for (const Json& input : state["inputs"])
         text += "input    " + inQuotes(textOf(input["file"])) + " by " + textOf(input["decoder"]) + "\n";
-    for (size_t s = 0; s < state["segments"].size(); ++s) {
-        const Json& segment = state["segments"][s];
-        if (state["segments"].size() > 1)
-            text += "segment  " + std::to_string(s + 1) + (segment["enabled"] ? "" : ", switched off") + "\n";
-        for (const Json& source : segment["sources"]) text += sourceLines(source);
-    }
+    text += segmentLines(state["segments"]);
     for (const Json& stream : state["streams"]) text += "stream   " + streamLine(stream) + "\n";
     const std::string output = textOf(state["output"]);
     text += "output   " + (output.empty() ? "nothing" : inQuotes(output)) + " by " + textOf(state["muxer"]) +

@@ -21,27 +21,32 @@ std::string refusal(Action action) {
 }
 
 TEST(ChannelMap, IsReadAndRefused) {
-    using Rows = std::vector<std::vector<int>>;
+    using Rows = std::vector<std::vector<ChannelMap::Input>>;
     const struct {
         const char* text;
-        int sound;
+        std::vector<int> sounds;
         Rows rows;
         bool copies;
     } good[] = {
-        {"0", 0, {{0}}, true},
-        {"1,0", 0, {{1}, {0}}, true},
-        {"-,3,-", 0, {{}, {3}, {}}, true},
-        {"-", 0, {{}}, true},
-        {"0+1+2,-", 0, {{0, 1, 2}, {}}, false},
-        {"a:1.0,a:1.255+a:1.0", 1, {{0}, {255, 0}}, false},
-        {"a:0.1,0", 0, {{1}, {0}}, true},
+        {"0", {0}, {{{0, 0}}}, true},
+        {"1,0", {0}, {{{0, 1}}, {{0, 0}}}, true},
+        {"-,3,-", {0}, {{}, {{0, 3}}, {}}, true},
+        {"-", {0}, {{}}, true},
+        {"0+1+2,-", {0}, {{{0, 0}, {0, 1}, {0, 2}}, {}}, false},
+        {"a:1.0,a:1.255+a:1.0", {1}, {{{1, 0}}, {{1, 255}, {1, 0}}}, false},
+        {"a:7.1,0,a:2.0", {0, 2, 7}, {{{7, 1}}, {{0, 0}}, {{2, 0}}}, true},
     };
     for (const auto& row : good) {
         const ChannelMap map = parseChannelMap(row.text);
-        EXPECT_EQ(map.sound, row.sound) << row.text;
-        EXPECT_EQ(map.rows, row.rows) << row.text;
+        EXPECT_EQ(map.sounds(), row.sounds) << row.text;
+        EXPECT_TRUE(map.rows == row.rows) << row.text;
         EXPECT_EQ(map.copies(), row.copies) << row.text;
     }
+    // Sounds 0, 2 and 7 of 2, 1 and 3 channels, side by side.
+    const AnyVector matrix = parseChannelMap("a:7.1,0,-,a:2.0+1").matrix({0, 2, 3});
+    const auto source = [](int channel) { return Any(AnyDict("channel", channel)); };
+    EXPECT_EQ(matrix, AnyVector(Any(AnyVector(source(4))), Any(AnyVector(source(0))), Any(0),
+                                Any(AnyVector(source(2), source(1)))));
     for (const char* text :
          {"",     ",",    "0,",      ",0",     "0++1", "+",   "x",    "0 ",          "1.0",   "a:",  "a:1",
           "a:1.", "a:.1", "a:1.1.1", "a:-1.0", "--1",  "0+-", "1000", "99999999999", "b:1.0", "0x1", "0;1"})

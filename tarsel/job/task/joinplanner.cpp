@@ -1,0 +1,105 @@
+#include "tarsel/job/task/joinplanner.h"
+
+#include <algorithm>
+
+#include "tarsel/job/task/divide.h"
+#include "tarsel/words/messages.h"
+
+namespace {
+
+void refuse(bool given, const char* option) {
+    if (given) throw failure(Msg::joinRefuses, {option});
+}
+
+AnyDict storedInput(const Source& source, const std::string& name) {
+    AnyDict decoder;
+    source.decoder().store(decoder);
+    return AnyDict("filename", name.c_str(), "decoder", Any(decoder));
+}
+
+// "IN,OUT" of --fade, of which the first segment has the beginning and the last one the end.
+std::string fadeOf(const std::string& given, bool first, bool last) {
+    if (given.empty() || (!first && !last)) return "";
+    const size_t comma = std::min(given.find(','), given.size());
+    const std::string in = given.substr(0, comma), out = comma < given.size() ? given.substr(comma + 1) : in;
+    return (first ? in : "0") + "," + (last ? out : "0");
+}
+
+}  // namespace
+
+JoinPlanner::JoinPlanner(const PlanOptions& options, const OutputForm& form, Opener open)
+    : options_(options), form_(form), open_(std::move(open)) {
+    const bool points = !options.from.empty() || !options.to.empty() || !options.duration.empty();
+    const char* const how = options.join ? "--join" : "--cut";
+    if (options.join && !options.cuts.empty()) throw failure(Msg::optionsExclude, {"--join", "--cut"});
+    if (points) throw failure(Msg::optionsExclude, {how, "--from, --to and --duration"});
+    refuse(!options.sound.delay.empty(), "--delay");
+    refuse(!options.sound.normalize.empty(), "--normalize");
+    for (const std::string& spec : options.effects.filters) requireDivisible(spec.substr(0, spec.find(':')));
+    join_.ofCuts = !options.join;
+}
+
+std::vector<SegmentWords> JoinPlanner::words() const {
+    std::vector<SegmentWords> all;
+    for (const std::string& cut : options_.cuts) all.push_back({options_.inputs, parseRange(cut, "--cut")});
+    if (options_.join)
+        for (const std::string& word : options_.inputs) all.push_back(parseSegment(word));
+    return all;
+}
+
+void JoinPlanner::plan() {
+    const std::vector<SegmentWords> all = words();
+    for (size_t i = 0; i < all.size(); ++i) add(all[i], i == 0, i + 1 == all.size());
+    whole_.output = form_;
+    whole_.streams = join_.streams();
+    checkOutput(whole_, options_);
+}
+
+std::string JoinPlanner::name() const {
+    const size_t more = join_.segments.size() - 1;
+    return names_.front() + (more == 0 ? "" : " and " + std::to_string(more) + " more");
+}
+
+int JoinPlanner::inputNumber(const std::string& name) {
+    const auto known = std::find(names_.begin(), names_.end(), name);
+    if (known != names_.end()) return static_cast<int>(known - names_.begin());
+    const std::unique_ptr<Source> source = open_(name);
+    names_.push_back(name);
+    inputs_.push_back(readInput(*source));
+    join_.inputs.push_back(storedInput(*source, name));
+    files_.insert(files_.end(), source->files().begin(), source->files().end());
+    return static_cast<int>(names_.size()) - 1;
+}
+
+PlanOptions JoinPlanner::optionsOf(const SegmentWords& words, bool first, bool last) const {
+    PlanOptions options = options_;
+    options.inputs = words.inputs;
+    options.from = words.range.from;
+    options.to = words.range.to;
+    options.effects.fade = fadeOf(options_.effects.fade, first, last);
+    return options;
+}
+
+void JoinPlanner::add(const SegmentWords& words, bool first, bool last) {
+    JoinedSegment segment;
+    std::vector<JobInput> inputs;
+    for (const std::string& name : words.inputs) {
+        segment.inputs.push_back(inputNumber(name));
+        inputs.push_back(inputs_[static_cast<size_t>(segment.inputs.back())]);
+    }
+    segment.plan = planJob(optionsOf(words, first, last), form_, std::move(inputs), &known_);
+    remember(segment.plan);
+    join_.segments.push_back(std::move(segment));
+}
+
+// The first segment that has a stream gives its format.
+void JoinPlanner::remember(const JobPlan& plan) {
+    for (const PlannedStream& stream : plan.streams) {
+        const auto number = static_cast<size_t>(stream.number);
+        if (stream.isVideo() && number >= known_.pictures.size()) known_.pictures.push_back(stream.picture);
+        if (!stream.isVideo() && number >= known_.sounds.size()) known_.sounds.push_back(stream.sound);
+    }
+    whole_.warnings.insert(whole_.warnings.end(), plan.warnings.begin(), plan.warnings.end());
+    const auto& read = plan.filterFiles.read;
+    files_.insert(files_.end(), read.begin(), read.end());
+}

@@ -1,0 +1,46 @@
+// The plan of a join: what the options and the words of its segments mean.
+#pragma once
+
+#include <functional>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "tarsel/job/plan/jobplan.h"
+#include "tarsel/job/task/join.h"
+#include "tarsel/source/segmentwords.h"
+
+class JoinPlanner {
+  public:
+    using Opener = std::function<std::unique_ptr<Source>(const std::string& name)>;
+
+    // The options have to outlive it. Throws Failure for options that have no meaning for segments.
+    JoinPlanner(const PlanOptions& options, const OutputForm& form, Opener open);
+
+    // Opens the inputs, each once and one at a time, and plans the segments. Throws Failure.
+    void plan();
+    const Join& join() const { return join_; }
+    // The output as a whole, without inputs.
+    const JobPlan& whole() const { return whole_; }
+    // What is read: inputs, and the files of filters.
+    const std::vector<std::string>& files() const { return files_; }
+    // For messages: the first input, and how many segments there are.
+    std::string name() const;
+
+  private:
+    std::vector<SegmentWords> words() const;
+    int inputNumber(const std::string& name);
+    PlanOptions optionsOf(const SegmentWords& words, bool first, bool last) const;
+    void add(const SegmentWords& words, bool first, bool last);
+    void remember(const JobPlan& plan);
+
+    const PlanOptions& options_;
+    OutputForm form_;
+    Opener open_;
+    std::vector<std::string> names_;  // of Join::inputs
+    std::vector<JobInput> inputs_;
+    KnownFormats known_;
+    Join join_;
+    JobPlan whole_;
+    std::vector<std::string> files_;
+};
