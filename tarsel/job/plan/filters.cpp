@@ -40,20 +40,18 @@ FilterPlanner::FilterPlanner(JobPlan& plan, const EffectOptions& options,
 }
 
 void FilterPlanner::plan() {
-    checkEffects();
     for (PlannedStream& stream : plan_.streams)
         if (stream.isVideo()) planPicture(stream);
 }
 
-// What was asked for has to have something that it works on.
-void FilterPlanner::checkEffects() const {
-    const bool sound = plan_.count(qvAudioStream) > 0;
-    const std::string option = options_.given();
-    if (!option.empty() && !plan_.hasVideo() && !(sound && option == "--fade"))
+void checkEffects(const JobPlan& plan, const EffectOptions& options) {
+    const bool sound = plan.count(qvAudioStream) > 0;
+    const std::string option = options.given();
+    if (!option.empty() && !plan.hasVideo() && !(sound && option == "--fade"))
         throw failure(Msg::effectNoPicture, {option});
-    for (const auto& spec : options_.filters) {
+    for (const auto& spec : options.filters) {
         const int type = filterType(spec);
-        if (std::any_of(plan_.streams.begin(), plan_.streams.end(),
+        if (std::any_of(plan.streams.begin(), plan.streams.end(),
                         [&](const auto& s) { return s.type == type; }))
             continue;
         throw failure(Msg::filterNoStream,

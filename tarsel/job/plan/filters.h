@@ -9,6 +9,9 @@
 struct JobPlan;
 struct PlannedStream;
 
+// What was asked for has to have something that it works on. Throws Failure.
+void checkEffects(const JobPlan& plan, const EffectOptions& options);
+
 class FilterPlanner {
   public:
     // Sets the format of each video stream, which the lengths depend on: the one that is `known` for its
@@ -16,11 +19,10 @@ class FilterPlanner {
     // Failure for options that do not fit a stream.
     FilterPlanner(JobPlan& plan, const EffectOptions& options, const std::vector<PictureFormat>& known = {});
     // Sets the filters of all pictures and what they read and write. The lengths have to be known. Throws
-    // Failure for filters that can't be used, or that have nothing to work on.
+    // Failure for filters that can't be used.
     void plan();
 
   private:
-    void checkEffects() const;
     void planPicture(PlannedStream& stream);
 
     JobPlan& plan_;

@@ -183,6 +183,7 @@ JobPlan planJob(const PlanOptions& options, const OutputForm& output, std::vecto
     planEnds(plan, options.shortest, options.longest);
     planFrames(plan);
     planSamples(plan);
+    if (!known) checkEffects(plan, effects);
     filters.plan();
     sounds.planFilters();
     return plan;

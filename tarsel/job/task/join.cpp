@@ -32,6 +32,20 @@ MediaTime lengthOf(const JobPlan& plan) {
     return shortest;
 }
 
+// A part begins and ends with a frame of its picture, as it does in a job of one part; its sound goes with it.
+void alignToFrames(const JobPlan& plan, StreamPart& part) {
+    const PlannedStream* const video = findStream(plan, qvVideoStream, 0);
+    if (!video || part.whole) return;
+    const QvFramerate& rate = plan.source(*video).picture.rate;
+    const QvFrameRange frames(video->part.in, video->part.out, rate);
+    const auto aligned = [&](const MediaTime& point) {
+        if (point == video->part.in) return qvInstantOf(frames.start, rate.rate());
+        return point == video->part.out ? qvInstantOf(frames.stop + 1LL, rate.rate()) : point;
+    };
+    part.in = aligned(part.in);
+    part.out = aligned(part.out);
+}
+
 class StateBuilder {
   public:
     StateBuilder(const Join& join) : join_(join), streams_(join.streams()) {
@@ -80,6 +94,7 @@ class StateBuilder {
         AnyDict source("file", inputOf(segment, *own).get("filename"));
         source.set("stream", Any(Pair(own->type, own->part.stream)));
         PlannedStream divided = *own;
+        alignToFrames(segment.plan, divided.part);
         place.first = own->isVideo() ? own->part.in.position(own->picture.rate) : 0;
         place.rate = own->picture.rate;
         moveTexts(divided.filters, place);

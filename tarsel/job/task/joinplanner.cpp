@@ -1,9 +1,13 @@
 #include "tarsel/job/task/joinplanner.h"
 
 #include <algorithm>
+#include <cstdio>
+#include <optional>
 
+#include "tarsel/job/plan/filters.h"
 #include "tarsel/job/task/divide.h"
 #include "tarsel/words/messages.h"
+#include "tarsel/words/timespec.h"
 
 namespace {
 
@@ -17,11 +21,19 @@ AnyDict storedInput(const Source& source, const std::string& name) {
     return AnyDict("filename", name.c_str(), "decoder", Any(decoder));
 }
 
-// "IN,OUT" of --fade, of which the first segment has the beginning and the last one the end.
-std::string fadeOf(const std::string& given, bool first, bool last) {
+std::string inSeconds(const std::string& time, const QvFramerate& rate) {
+    char text[32];
+    std::snprintf(text, sizeof text, "%.9f", parseTime(time, rate, "--fade").seconds());
+    return text;
+}
+
+// "IN,OUT" of --fade, of which the first segment has the beginning and the last one the end. `rate`: of the
+// frames that it counts, for a segment that has no picture of its own.
+std::string fadeOf(const std::string& given, bool first, bool last, const std::optional<QvFramerate>& rate) {
     if (given.empty() || (!first && !last)) return "";
     const size_t comma = std::min(given.find(','), given.size());
-    const std::string in = given.substr(0, comma), out = comma < given.size() ? given.substr(comma + 1) : in;
+    std::string in = given.substr(0, comma), out = comma < given.size() ? given.substr(comma + 1) : in;
+    if (rate) in = inSeconds(in, *rate), out = inSeconds(out, *rate);
     return (first ? in : "0") + "," + (last ? out : "0");
 }
 
@@ -53,6 +65,9 @@ void JoinPlanner::plan() {
     whole_.output = form_;
     whole_.streams = join_.streams();
     checkOutput(whole_, options_);
+    checkEffects(whole_, options_.effects);
+    if (const std::string given = options_.sound.given(); !given.empty() && known_.sounds.empty())
+        throw failure(Msg::effectNoSound, {given});
 }
 
 std::string JoinPlanner::name() const {
@@ -71,12 +86,19 @@ int JoinPlanner::inputNumber(const std::string& name) {
     return static_cast<int>(names_.size()) - 1;
 }
 
-PlanOptions JoinPlanner::optionsOf(const SegmentWords& words, bool first, bool last) const {
+PlanOptions JoinPlanner::optionsOf(const SegmentWords& words, const std::vector<JobInput>& inputs, bool first,
+                                   bool last) const {
     PlanOptions options = options_;
     options.inputs = words.inputs;
     options.from = words.range.from;
     options.to = words.range.to;
-    options.effects.fade = fadeOf(options_.effects.fade, first, last);
+    const bool hasPicture =
+        std::any_of(inputs.begin(), inputs.end(), [](const JobInput& input) { return !input.video.empty(); });
+    if (std::all_of(inputs.begin(), inputs.end(), [](const JobInput& input) { return input.audio.empty(); }))
+        options.sound = SoundOptions();
+    std::optional<QvFramerate> rate;
+    if (!hasPicture && !known_.pictures.empty()) rate = known_.pictures.front().rate;
+    options.effects.fade = fadeOf(options_.effects.fade, first, last, rate);
     return options;
 }
 
@@ -87,7 +109,8 @@ void JoinPlanner::add(const SegmentWords& words, bool first, bool last) {
         segment.inputs.push_back(inputNumber(name));
         inputs.push_back(inputs_[static_cast<size_t>(segment.inputs.back())]);
     }
-    segment.plan = planJob(optionsOf(words, first, last), form_, std::move(inputs), &known_);
+    const PlanOptions options = optionsOf(words, inputs, first, last);
+    segment.plan = planJob(options, form_, std::move(inputs), &known_);
     remember(segment.plan);
     join_.segments.push_back(std::move(segment));
 }

@@ -30,7 +30,8 @@ class JoinPlanner {
   private:
     std::vector<SegmentWords> words() const;
     int inputNumber(const std::string& name);
-    PlanOptions optionsOf(const SegmentWords& words, bool first, bool last) const;
+    PlanOptions optionsOf(const SegmentWords& words, const std::vector<JobInput>& inputs, bool first,
+                          bool last) const;
     void add(const SegmentWords& words, bool first, bool last);
     void remember(const JobPlan& plan);
 

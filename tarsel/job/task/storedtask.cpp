@@ -80,10 +80,11 @@ StoredTask::StoredTask(const std::string& file) : name_(file) {
 }
 
 StoredTask::StoredTask(const AnyDict& state, const std::string& name) : name_(name) {
-    const std::unique_ptr<XmlNode, void (*)(XmlNode*)> node(new XmlNode(kClass), XmlNode::deleteTree);
+    const auto node = std::make_unique<XmlNode>(kClass);
     XmlTrans trans;
     trans.DictToXml(state, node.get());
     trans.XmlToDict(node.get(), raw_);
+    for (const char* key : {"__class__", "__version__"}) raw_.set(key, state.get(key));  // of the document
     state_ = QvTaskState(raw_);
 }
 
