@@ -3,11 +3,21 @@
 #include <algorithm>
 
 #include "core/decode/qvdecoder.h"
+#include "core/measure/exactmath_p.h"
 #include "core/measure/mediarange.h"
 
 namespace {
 
-// A stored list can hold anything; what is no pair of times is as good as absent.
+// Stored points can hold anything: they are brought to where they can be compared, none is negative, and what
+// is no pair of times is as good as absent.
+MediaTime usable(const MediaTime& time) {
+    const long long ticks =
+        time.timescale() == MediaTime::defaultTimescale
+            ? time.value()
+            : qvmath::mulDiv(time.value(), MediaTime::defaultTimescale, 1, time.timescale());
+    return MediaTime(std::max(ticks, 0LL));
+}
+
 std::optional<InOutPoints> pointsOf(const ProcessParams& params) {
     auto points = params.inOutPoints();
     if (!points || points->count() == 0) return std::nullopt;
@@ -43,16 +53,17 @@ MediaTime subpicDuration(QvDecodePipe& decoder, int number) {
 
 QvIStream::~QvIStream() = default;
 
-Any QvIStream::filename() const { return decoder ? decoder->getParam("filename") : Any(); }
+Any QvIStream::filename() const { return decoder ? decoder->QvCodec::getParam("filename") : Any(); }
 
 MediaTime QvIStream::inPoint() const {
     const auto points = pointsOf(params);
-    return points ? points->inPoint() : MediaTime();
+    return points ? usable(points->inPoint()) : MediaTime();
 }
 
 MediaTime QvIStream::outPoint() const {
     const auto points = pointsOf(params);
-    return points && points->outPoint().value() != 0 ? points->outPoint() : duration();
+    const MediaTime out = points ? usable(points->outPoint()) : MediaTime();
+    return out.value() != 0 ? out : duration();
 }
 
 void QvIStream::setInPoint(const MediaTime& time) {

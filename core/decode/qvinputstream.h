@@ -9,12 +9,12 @@
 
 class QvDecodePipe;
 
-// The decoder belongs to the caller and outlives the stream. Times are at MediaTime::defaultTimescale.
+// The decoder belongs to the caller and outlives the stream. Times are at MediaTime::defaultTimescale, also
+// where stored points have another one, and never negative.
 class QV_API QvIStream {
   public:
     QvIStream() = default;
-    QvIStream(QvDecodePipe* decoder, int type, int number)
-        : decoder(decoder), type(type), number(number) {}
+    QvIStream(QvDecodePipe* decoder, int type, int number) : decoder(decoder), type(type), number(number) {}
     QvIStream(const QvIStream&) = default;
     QvIStream& operator=(const QvIStream&) = default;
     virtual ~QvIStream();
@@ -26,8 +26,9 @@ class QV_API QvIStream {
     MediaTime outPoint() const;
     void setInPoint(const MediaTime& time);
     void setOutPoint(const MediaTime& time);
-    MediaTime duration() const;           // of the whole stream
-    MediaTime effectiveDuration() const;  // from the in point to the out point, or to the end if that is earlier
+    MediaTime duration() const;  // of the whole stream, no shorter than its last frame or sample
+    MediaTime effectiveDuration()
+        const;  // from the in point to the out point, or to the end if that is earlier
 
     // The same stream of the same decoder; points and filters are not compared.
     bool operator==(const QvIStream& other) const;

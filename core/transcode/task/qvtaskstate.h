@@ -8,64 +8,24 @@
 // Keys: "__version__", "__class__", "encoder" (a QvEncodePipeState), "filename" (of the output), "files" (a
 // Vector of File), "streams" (a Vector with a Dict for each output stream: "type", and "sources", a Vector
 // with a Source for each segment), "postProcess", "enabled", "segments" (a Vector of 1 and 0), "presetName".
-// "#nsegs" is the number of segments as last counted: who changes "streams" by hand removes it.
+// "#nsegs" is the number of segments as last counted, -1 when the streams differ: who changes "streams" by
+// hand removes it. "segments" appears when a segment is first enabled, disabled, added, removed or moved.
 //
-// A *segment* is one Source for each output stream; several are played one after the other. What is absent, or
-// of another type, reads as an empty value. Wrong indexes and counts are a line in the log and an assertion
-// (QvAssertFailure): a state from a file of any origin is checked by QvTaskFile first.
+// A *segment* is one Source for each output stream; several are played one after the other. What is absent,
+// or of another type, reads as an empty value. Wrong indexes and counts are a line in the log and an
+// assertion (QvAssertFailure): a state from a file of any origin is checked by QvTaskFile first.
 #pragma once
 
 #include <array>
+#include <memory>
 #include <vector>
 
 #include "core/arch/api.h"
 #include "core/job/processparams.h"
-#include "core/measure/qvframerate.h"
+#include "core/transcode/task/qvencodepipestate.h"
 #include "core/value/any.h"
 #include "core/value/anycontainer.h"
 #include "core/value/ptrlist.h"
-
-// One output stream of a stored encode pipe.
-class QV_API QvEncodePipeStreamState : public AnyDict {
-  public:
-    QvEncodePipeStreamState() = default;
-    QvEncodePipeStreamState(const AnyDict& dict) : AnyDict(dict) {}
-
-    int type() const;  // QvStreamType; 0 when absent
-    AnyDict codecParams() const;
-    Any codecName() const;
-    AnyDict streamParams() const;
-    // What the encoder says about itself, for display.
-    AnyDict codecInfo() const;
-    Any codecDisplayName() const;  // the codec's name when there is no other
-    Any framerate() const;
-    Any bitrate() const;
-    int samplerate() const;  // these four: 0 when absent
-    int width() const;
-    int height() const;
-    int channels() const;
-};
-
-// The stored encode pipe: its streams, its multiplexer, its preset.
-class QV_API QvEncodePipeState : public AnyDict {
-  public:
-    QvEncodePipeState() = default;
-    QvEncodePipeState(const AnyDict& dict) : AnyDict(dict) {}
-
-    AnyVector streams() const;
-    // Asserts "Invalid list index".
-    QvEncodePipeStreamState stream(int index) const;
-    // The second-th stream of the type that is first; empty when there is none.
-    QvEncodePipeStreamState stream(const Pair& address) const;
-    int nrStreams() const;
-    int nrStreams(int type) const;  // of the types of a mask; 0 and 255 mean all
-    AnyDict muxer() const;
-    Any muxerName() const;
-    Any muxerDisplayName() const;  // its name when there is no other
-    AnyVector programs() const;
-    // Its own, else that of the built-in preset of its "profile", else invalid.
-    Any presetName() const;
-};
 
 class QV_API QvTaskState : public AnyDict {
   public:
@@ -75,7 +35,7 @@ class QV_API QvTaskState : public AnyDict {
         Source() = default;
         Source(const AnyDict& dict) : AnyDict(dict) {}
 
-        const Any& filename() const { return get("file"); }
+        Any filename() const { return get("file"); }
         int type() const;    // QvStreamType; 0 when absent
         int number() const;  // of the stream within its type
         ProcessParams processParams() const;
@@ -88,13 +48,20 @@ class QV_API QvTaskState : public AnyDict {
         File() = default;
         File(const AnyDict& dict) : AnyDict(dict) {}
 
-        const Any& filename() const { return get("filename"); }
+        Any filename() const { return get("filename"); }
         AnyDict decoder() const;
     };
 
-    // In the order of the output streams. The sources stay in the state, which outlives the list and is not
-    // changed meanwhile; a stream without a source has an empty one.
-    using Segment = TRefList<const Source>;
+    // The sources of a segment in the order of the output streams, as they were when it was asked for; an
+    // output stream without a source has an empty one. Copies share the sources.
+    class QV_API Segment : public TRefList<const Source> {
+      public:
+        Segment() = default;
+        explicit Segment(std::vector<Source> sources);
+
+      private:
+        std::shared_ptr<const std::vector<Source>> sources_;
+    };
 
     QvTaskState() = default;
     QvTaskState(const AnyDict& dict) : AnyDict(dict) {}
@@ -108,26 +75,29 @@ class QV_API QvTaskState : public AnyDict {
     void setPostprocessCommand(const Any& command) { set("postProcess", command); }
     bool isEnabled() const;  // true when absent
     void setEnabled(bool on);
-    AnyVector inputFiles() const;
+    // References live until the state changes; they are to the null sentinel for what is absent.
+    const AnyVector& inputFiles() const { return getVector("files"); }
     AnyVector inputFilenames() const;
 
     // --- Streams --------------------------------------------------------------------------------
 
-    AnyVector streams_in() const;                   // what feeds the output streams
-    AnyVector streams_out() const;                  // the encode pipe's
-    AnyDict stream_in(int index) const;             // empty out of range
-    AnyDict stream_in(const Pair& address) const;   // (type, number)
-    int nrStreams(int type) const;                  // of the encode pipe; a mask, 0 and 255 mean all
+    // What feeds the output streams, and the encode pipe's own.
+    const AnyVector& streams_in() const { return getVector("streams"); }
+    const AnyVector& streams_out() const { return getDict("encoder").getVector("streams"); }
+    const AnyDict& stream_in(int index) const;            // empty out of range
+    const AnyDict& stream_in(const Pair& address) const;  // (type, number)
+    int nrStreams(int type) const;                        // of the encode pipe; a mask, 0 and 255 mean all
     int nrStreams(std::array<int, 3>& count) const;       // also video, audio, subpicture
     int nrValidStreams(std::array<int, 3>& count) const;  // only those with a source
     int nrSources(int stream) const;
     Source source(int stream, int segment) const;  // empty out of range, as the next three
     Source source(const Pair& address, int segment) const;
-    AnyVector sources(int stream) const;
-    AnyVector sources(const Pair& address) const;
+    const AnyVector& sources(int stream) const;
+    const AnyVector& sources(const Pair& address) const;
     ProcessParams processParams(int stream, int segment) const;
     ProcessParams processParams(const Pair& address, int segment) const;
-    int fileByFilename(const Any& name) const;  // index in inputFiles(), or -1
+    // Index in inputFiles(), or -1. Asserts an input file without a name.
+    int fileByFilename(const Any& name) const;
     int fileForSource(const Source& source) const;
     // (type, number) of each output stream whose first segment comes from that file.
     AnyVector streamsForFile(const Any& name) const;
@@ -143,20 +113,31 @@ class QV_API QvTaskState : public AnyDict {
 
     // --- Segments -------------------------------------------------------------------------------
 
-    int nrSegments() const;  // 0 when the streams differ in their count
-    AnyVector segments() const;
+    // 0 when the streams differ in their count. Streams without sources do not count. The first of the two
+    // keeps what it has counted as "#nsegs".
+    int nrSegments();
+    int nrSegments() const;
+    AnyVector segments() const;  // 1 or 0 for each
     bool isSegmentEnabled(int index) const;
-    void setSegmentEnabled(int index, bool on);
+    void setSegmentEnabled(int index, bool on);  // asserts an index out of range
     // The sources of a segment; -13 (QvStatus::invalidStructure) beyond the count. `fileIndices`, if given,
     // takes for each source its place in inputFiles(), or -1.
     int getSegment(int index, Segment* segment, std::vector<int>* fileIndices = nullptr) const;
+    // The input files that the segment uses, each once, in the order of its sources. As getSegment.
     int getFilesForSegment(int index, AnyVector& files) const;
     // One source a stream, of the stream's type. `files` (Dicts that are a File) join the input files where
-    // their name is new. In front of `position`, -1 appends. 0, or an assertion.
+    // their name is new. In front of `position`, -1 appends. 0, or an assertion that leaves all as it was,
+    // also for a state without sources and without "segments".
     int addSegment(const AnyVector& sources, const AnyVector& files, int position = -1);
     // Replaces a segment. With another file or stream number `files` must not be empty.
     int updateSegment(const AnyVector& sources, const AnyVector& files, int position);
     // The input files stay as they are, also those that nothing uses any more.
     int removeSegment(int index);
-    int swapSegments(int a, int b);
+    int swapSegments(int a, int b);  // -1 without streams
+
+  private:
+    int countSegments() const;
+    int _checkSegmentCounts();
+    void _initEnabledState();
+    void addFiles(const AnyVector& files);
 };
