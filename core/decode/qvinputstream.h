@@ -27,8 +27,8 @@ class QV_API QvIStream {
     void setInPoint(const MediaTime& time);
     void setOutPoint(const MediaTime& time);
     MediaTime duration() const;  // of the whole stream, no shorter than its last frame or sample
-    MediaTime effectiveDuration()
-        const;  // from the in point to the out point, or to the end if that is earlier
+    // From the in point to the out point, or to the end if that is earlier.
+    MediaTime effectiveDuration() const;
 
     // The same stream of the same decoder; points and filters are not compared.
     bool operator==(const QvIStream& other) const;

@@ -8,6 +8,7 @@
 #include "core/arch/formattext_p.h"
 #include "core/arch/qvassert.h"
 #include "core/decode/qvdecoder.h"
+#include "core/decode/qvinputstream.h"
 #include "core/encode/qvencodepipe.h"
 #include "core/engine/log/qvlog.h"
 #include "core/engine/status.h"
@@ -15,6 +16,7 @@
 #include "core/transcode/link/audio/transalink.h"
 #include "core/transcode/link/video/transvlink.h"
 #include "core/transcode/task/postprocess_p.h"
+#include "core/transcode/task/segmentdurations_p.h"
 #include "core/transcode/task/taskcheck_p.h"
 #include "core/transcode/task/taskstore_p.h"
 
@@ -335,6 +337,31 @@ int QvTask::checkStreams() {
 
 int QvTask::checkLegal(AnyVector& messages) {
     return TaskCheck(encoder_, links()).legal(processParams(qvAudioStream), messages);
+}
+
+int QvTask::checkDurations() {
+    std::vector<QvIStream> streams;
+    for (const auto& link : links_) {
+        streams.emplace_back(link->decoder(), link->type(), link->decStreamNr());
+        const Any& own = link->processParams().get("inOutPoints");
+        const Any& points = own.isVector() ? own : processParams(link->type()).get("inOutPoints");
+        if (points.isVector()) streams.back().params.set("inOutPoints", points);
+    }
+    if (streams.empty()) return QvStatus::ok;
+    QvIStreamList list;
+    for (QvIStream& stream : streams) list.append(&stream);
+    qvAdjustSegmentDurations(list);
+    for (std::size_t i = 0; i < streams.size(); ++i) {
+        TransLink& link = *links_[i];
+        QV_ASSERT(streams[i].decoder == link.decoder() && streams[i].type == link.type() &&
+                  streams[i].number == link.decStreamNr());
+        const auto points = streams[i].params.inOutPoints();
+        if (!points) continue;
+        ProcessParams own;
+        own.setInOutPoints(*points);
+        link.setProcessParams(own);
+    }
+    return QvStatus::ok;
 }
 
 int QvTask::checkMultiPass(TPtrList<TransLink>* list) const {

@@ -96,6 +96,10 @@ class QV_API QvTask {
     int checkLegal(AnyVector& messages);
     // 0, or a failure with a text: nothing linked, a muxer that needs video, too few views.
     int checkStreams();
+    // Lets the links end together, as the streams of one segment do: at the end of the shortest video, or of
+    // the shortest stream where there is no video. Sound that is shorter stays so. The links get points for
+    // it, in place of the task's own. 0.
+    virtual int checkDurations();
     // How many video links can be encoded in two passes; they are appended to `list` unless it is null.
     int checkMultiPass(TPtrList<TransLink>* list) const;
     // How many links can pass their coded data through; `dict` (may be null) gets "vids", "auds", "subs".
