@@ -41,18 +41,6 @@ AnyDict storedProcessParams(const AnyVector& streams, int type, int number) {
     return AnyDict();
 }
 
-// Null when it can't be opened, also because its settings are of a decoder that is not installed.
-QvDecodePipe* openInput(const AnyDict& file, QvFileOpenCb* callback) {
-    const AnyDict settings = file.getDict("decoder");
-    if (!settings.get("name").isString())
-        return QvDecFactory::decodePipe(file.get("filename"), Any(), callback, nullptr);
-    try {
-        return QvDecFactory::restoreDecoder(file.get("filename"), settings, callback);
-    } catch (const QvAssertFailure&) {
-        return nullptr;
-    }
-}
-
 void removeSurplusStreams(QvEncodePipe& pipe, int type, int wanted) {
     while (pipe.nrStreams(type) > wanted) pipe.removeStream(type, pipe.nrStreams(type) - 1);
 }
@@ -117,6 +105,19 @@ int linkStoredStream(QvTask& task, const AnyDict& entry, int index, const QvDPip
 }
 
 }  // namespace
+
+QvDecodePipe* openInput(const AnyDict& file, QvFileOpenCb* callback) {
+    const AnyDict settings = file.getDict("decoder");
+    if (!settings.get("name").isString())
+        return QvDecFactory::decodePipe(file.get("filename"), Any(), callback, nullptr);
+    try {
+        return QvDecFactory::restoreDecoder(file.get("filename"), settings, callback);
+    } catch (const QvMemoryFailure&) {
+        throw;
+    } catch (const QvAssertFailure&) {
+        return nullptr;
+    }
+}
 
 void store(const QvTask& task, AnyDict& dict) {
     dict.clear();

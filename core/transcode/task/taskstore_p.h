@@ -11,6 +11,9 @@ namespace qvtaskstore {
 void store(const QvTask& task, AnyDict& dict);
 // The version and the class are those of a task.
 bool isTask(const AnyDict& state);
+// An open decoder for an entry of "files", for the caller. Null when it can't be opened, also because its
+// settings are of a decoder that is not installed.
+QvDecodePipe* openInput(const AnyDict& file, QvFileOpenCb* callback);
 // Into a task without links: see QvTask::restore. A fault without a text is one that the task has reported
 // itself.
 TaskFault restore(QvTask& task, const AnyDict& state, QvDPipeList& decoders, QvEncodePipe** encoderOut,

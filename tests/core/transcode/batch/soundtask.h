@@ -5,7 +5,7 @@
 
 #include "core/document/xmldom.h"
 #include "core/encode/qvencodepipe.h"
-#include "core/transcode/task/qvtaskfile.h"
+#include "core/transcode/batch/qvtaskfile.h"
 #include "tests/support/engine.h"
 #include "tests/support/temp_folder.h"
 #include "tests/support/wav_bytes.h"

@@ -2,9 +2,9 @@
 // there is a fault, no exception, and nothing that was made.
 #include "core/decode/qvdecoder.h"
 #include "core/engine/status.h"
-#include "core/transcode/task/qvtaskfile.h"
+#include "core/transcode/batch/qvtaskfile.h"
 #include "core/transcode/task/qvtranscodetask.h"
-#include "tests/core/transcode/task/soundtask.h"
+#include "tests/core/transcode/batch/soundtask.h"
 #include "tests/support/failing_memory.h"
 
 namespace {

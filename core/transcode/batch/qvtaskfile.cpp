@@ -1,11 +1,13 @@
-#include "core/transcode/task/qvtaskfile.h"
+#include "core/transcode/batch/qvtaskfile.h"
 
 #include <algorithm>
 #include <charconv>
 #include <cstdlib>
 #include <memory>
 #include <new>
+#include <set>
 #include <string_view>
+#include <unordered_set>
 #include <vector>
 
 #include "core/arch/qvexception.h"
@@ -16,7 +18,7 @@
 #include "core/engine/modules/qvregistry.h"
 #include "core/engine/status.h"
 #include "core/measure/streamtype.h"
-#include "core/transcode/task/qvtranscodetask.h"
+#include "core/transcode/task/qvtaskstate.h"
 #include "core/value/numbertext_p.h"
 
 namespace {
@@ -181,21 +183,69 @@ int streamType(const Place& stream) {
     damaged(found, "it is no type of stream: 1 is video, 2 audio, 4 subpicture");
 }
 
-void checkSource(const Place& source, int type, const std::vector<std::string>& files) {
+// The points of a source: times, in and out in turn.
+void checkPoints(const Place& source) {
+    const Place process = source.entry("process");
+    const Place points = process && isDictionary(process) ? process.entry("inOutPoints") : Place();
+    if (!points) return;
+    if (points.name() != "vec" || points.node->nrChildren() % 2 != 0)
+        damaged(points, "it holds no pairs of times");
+    for (int i = 0; i < points.node->nrChildren(); ++i)
+        if (const Place point = points.child(i, std::to_string(i + 1)); point.name() != "mediatime")
+            damaged(point, "it is no time");
+}
+
+using Names = std::unordered_set<std::string>;
+
+// A segment's file is opened with the defaults of its kind if `files` (null then) does not list it.
+void checkSource(const Place& source, int type, const Names* files) {
     const std::string file = text(source, "file");
-    if (std::find(files.begin(), files.end(), file) == files.end())
-        damaged(source.entry("file"), "no entry of 'files' has this name");
+    if (file.empty()) damaged(source.entry("file"), "the name is empty");
+    if (files && files->count(file) == 0) damaged(source.entry("file"), "no entry of 'files' has this name");
     const Place stream = source.entry("stream");
     if (!stream || stream.name() != "pair")
         damaged(stream ? stream : source, "there is no pair of stream numbers");
     if (attribute(*stream.node, "first") != std::to_string(type))
         damaged(stream, "its type is not that of the output's stream");
     if (attribute(*stream.node, "second")[0] == '-') damaged(stream, "its number is negative");
+    checkPoints(source);
 }
 
-void checkStreams(const Place& root, const std::vector<std::string>& files) {
+int sourceCount(const Place& stream) {
+    const Place sources = isDictionary(stream) ? stream.entry("sources") : Place();
+    return sources && sources.name() == "vec" ? sources.node->nrChildren() : 0;
+}
+
+// How many segments the streams have; those without a source do not count.
+int segmentCount(const Place& streams) {
+    int common = 0;
+    for (int i = 0; i < streams.node->nrChildren(); ++i) {
+        const Place stream = streams.child(i, std::to_string(i + 1));
+        const int own = sourceCount(stream);
+        if (own == 0) continue;
+        if (common != 0 && own != common)
+            damaged(stream.entry("sources"), "it has " + std::to_string(own) +
+                                                 " segments, and another stream " + std::to_string(common));
+        common = own;
+    }
+    return common;
+}
+
+// Which segments are enabled: a number for each.
+void checkSegments(const Place& root, int count) {
+    const Place flags = root.entry("segments");
+    if (!flags) return;
+    if (flags.name() != "vec" || flags.node->nrChildren() != count)
+        damaged(flags, "it does not have one number for each of the " + std::to_string(count) + " segments");
+    for (int i = 0; i < count; ++i)
+        if (const Place flag = flags.child(i, std::to_string(i + 1)); flag.name() != "i32")
+            damaged(flag, "it is no number");
+}
+
+void checkStreams(const Place& root, const Names& files) {
     const Place made = list(dictionary(root, "encoder"), "streams", "output stream");
     const Place streams = list(root, "streams", "output stream");
+    const int segments = segmentCount(streams);
     for (int i = 0; i < std::min(made.node->nrChildren(), streams.node->nrChildren()); ++i) {
         const std::string number = std::to_string(i + 1);
         const Place stream = streams.child(i, number);
@@ -203,11 +253,15 @@ void checkStreams(const Place& root, const std::vector<std::string>& files) {
         const int type = streamType(stream);
         if (type != streamType(made.child(i, number)))
             damaged(stream, "the encoder's stream has another type");
-        if (!stream.entry("sources")) continue;
+        const Place given = stream.entry("sources");
+        if (!given || (given.name() == "vec" && given.node->nrChildren() == 0)) continue;
         const Place sources = list(stream, "sources", "source");
         for (int k = 0; k < sources.node->nrChildren(); ++k)
-            checkSource(sources.child(k, std::to_string(k + 1)), type, files);
+            checkSource(sources.child(k, std::to_string(k + 1)), type, segments == 1 ? &files : nullptr);
     }
+    if (made.node->nrChildren() < streams.node->nrChildren() && segments > 1)
+        damaged(streams, "the encoder has fewer streams");
+    checkSegments(root, segments);
 }
 
 void checkTask(const Place& root) {
@@ -219,52 +273,58 @@ void checkTask(const Place& root) {
     checkDictionary(root);
     for (const Text key : {"__version__", "__class__"})
         if (const Place own = root.entry(key)) damaged(own, "this is no key of a file");
-    std::vector<std::string> names;
+    Names names;
     const Place files = list(root, "files", "input file");
     for (int i = 0; i < files.node->nrChildren(); ++i) {
         const Place file = files.child(i, std::to_string(i + 1));
-        names.push_back(text(file, "filename"));
-        if (names.back().empty()) damaged(file.entry("filename"), "the name is empty");
+        const std::string name = text(file, "filename");
+        if (name.empty()) damaged(file.entry("filename"), "the name is empty");
+        names.insert(name);
     }
     checkStreams(root, names);
 }
 
 // --- The modules that it names.
 
+using Modules = std::set<std::pair<int, std::string>>;  // those that are there, by kind
+
 // `named` is a text, or a dictionary, whose name is an attribute or a key. One without a name is not checked.
-void checkModule(const Place& named, int type, const char* kind) {
+void checkModule(Modules& present, const Place& named, int type, const char* kind) {
     if (!named) return;
     std::string name = isDictionary(named) ? attribute(*named.node, "name") : "";
     const Place key = isDictionary(named) ? named.entry("name") : named;
     if (name.empty() && key && (key.name() == "str" || key.name() == "wstr")) name = key.node->data();
-    if (name.empty()) return;
+    if (name.empty() || present.count({type, name}) > 0) return;
     const std::unique_ptr<QvCodec> codec(qv_registry()->newCodec(name.c_str()));
     if (!codec || !codec->getInterface(type))
         throw Fault{named, QvStatus::failed, std::string("there is no ") + kind + " '" + name + "' here"};
+    present.emplace(type, name);
 }
 
 // The filters of a stream that have no fixed place.
-void checkFilters(const Place& source, int type) {
+void checkFilters(Modules& present, const Place& source, int type) {
     const Place process = source.entry("process");
     const Place filters = process && isDictionary(process) ? process.entry("filters") : process;
     const Place custom = filters && isDictionary(filters) ? filters.entry("customFilters") : filters;
     if (!custom || custom.name() != "vec") return;
     for (int i = 0; i < custom.node->nrChildren(); ++i)
-        checkModule(custom.child(i, std::to_string(i + 1)),
+        checkModule(present, custom.child(i, std::to_string(i + 1)),
                     type == qvVideoStream ? QvModuleType::videoFilter : QvModuleType::audioFilter, "filter");
 }
 
 void checkModules(const Place& root) {
     const Place files = root.entry("files"), encoder = root.entry("encoder");
+    Modules present;
     for (int i = 0; i < files.node->nrChildren(); ++i)
-        checkModule(files.child(i, std::to_string(i + 1)).entry("decoder"), QvModuleType::decoder, "decoder");
-    checkModule(encoder.entry("muxer"), QvModuleType::muxer, "multiplexer");
+        checkModule(present, files.child(i, std::to_string(i + 1)).entry("decoder"), QvModuleType::decoder,
+                    "decoder");
+    checkModule(present, encoder.entry("muxer"), QvModuleType::muxer, "multiplexer");
     const Place streams = encoder.entry("streams");
     for (int i = 0; i < streams.node->nrChildren(); ++i) {
         const Place stream = streams.child(i, std::to_string(i + 1));
         const int type = streamType(stream);
         if (type != qvSubpicStream)
-            checkModule(stream.entry("codec"),
+            checkModule(present, stream.entry("codec"),
                         type == qvVideoStream ? QvModuleType::videoEncoder : QvModuleType::audioEncoder,
                         "encoder");
     }
@@ -273,7 +333,7 @@ void checkModules(const Place& root) {
         const Place output = outputs.child(i, std::to_string(i + 1));
         const Place sources = output.entry("sources");
         for (int k = 0; sources && k < sources.node->nrChildren(); ++k)
-            checkFilters(sources.child(k, std::to_string(k + 1)), streamType(output));
+            checkFilters(present, sources.child(k, std::to_string(k + 1)), streamType(output));
     }
 }
 
@@ -368,17 +428,21 @@ QvTaskFault QvTaskFile::check(const Any& file) noexcept {
 }
 
 QvTask* QvTaskFile::open(const Any& file, QvDPipeList& decoders, QvEncodePipe** encoder,
-                         QvFileOpenCb* callback, QvTaskFault* fault) noexcept {
+                         QvFileOpenCb* callback, QvTaskFault* fault, int options) noexcept {
     std::unique_ptr<QvTask> task;
     QvEncodePipe* pipe = nullptr;
     QvDPipeList opened;
     const int before = decoders.size();
     QvTaskFault found = guarded([&]() -> QvTaskFault {
-        AnyDict state;
+        QvTaskState state;
         if (QvTaskFault first = checked(file, state); first.status != QvStatus::ok) return first;
         Any error;
         try {
-            task.reset(QvTask::fromState(state, opened, &pipe, 0, callback, &error));
+            if (const int segments = state.nrSegments();
+                segments == 0 || (segments == 1 && state.isSegmentEnabled(0)))
+                task.reset(QvTask::fromState(state, opened, &pipe, 0, callback, &error));
+            else
+                task.reset(QvBatchTask::fromState(state, opened, &pipe, options, callback, &error));
         } catch (const QvMemoryFailure&) {
             throw;
         } catch (const QvException&) {

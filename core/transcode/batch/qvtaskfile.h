@@ -13,6 +13,7 @@
 
 #include "core/arch/api.h"
 #include "core/decode/qvdpipelist.h"
+#include "core/transcode/batch/qvbatchtask.h"
 #include "core/value/any.h"
 
 class QvEncodePipe;
@@ -35,8 +36,10 @@ class QV_API QvTaskFile {
     // the output is made once, which opens no file. Inputs are not opened.
     static QvTaskFault check(const Any& file) noexcept;
 
-    // Checks a file and restores its task, as QvTask::fromState does: the caller owns the task, the pipe and
-    // the decoders. After a fault the result is null, nothing was made, and `fault`, if given, tells.
+    // Checks a file and restores its task: the caller owns the task, the pipe and the decoders. A task with
+    // one segment that is not disabled is restored as QvTask::fromState does, any other is a QvBatchTask with
+    // these options. After a fault the result is null, nothing was made, and `fault`, if given, tells.
     static QvTask* open(const Any& file, QvDPipeList& decoders, QvEncodePipe** encoder,
-                        QvFileOpenCb* callback = nullptr, QvTaskFault* fault = nullptr) noexcept;
+                        QvFileOpenCb* callback = nullptr, QvTaskFault* fault = nullptr,
+                        int options = QvBatchTask::skipDisabled | QvBatchTask::everySegmentOpens) noexcept;
 };

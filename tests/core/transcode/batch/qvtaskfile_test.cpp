@@ -1,11 +1,11 @@
-#include "core/transcode/task/qvtaskfile.h"
+#include "core/transcode/batch/qvtaskfile.h"
 
 #include <sstream>
 
 #include "core/encode/qvencodepipe.h"
 #include "core/engine/status.h"
 #include "core/transcode/task/qvtranscodetask.h"
-#include "tests/core/transcode/task/soundtask.h"
+#include "tests/core/transcode/batch/soundtask.h"
 #include "tests/support/checks.h"
 
 namespace {

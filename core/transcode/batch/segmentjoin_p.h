@@ -1,0 +1,16 @@
+// The decoder that plays the segments of a task one after the other.
+#pragma once
+
+#include <memory>
+#include <vector>
+
+#include "core/transcode/batch/qvbatchdecoder.h"
+#include "core/transcode/batch/qvbatchtask.h"
+
+class QvEncodePipe;
+
+// Of the open segments, at least two (assertion), with the formats of the output's streams that are fed; what
+// an encoder leaves open is as in the first segment. Not open yet. Null: there is no output, which is logged.
+// An assertion when a segment does not suit the output.
+std::unique_ptr<QvBatchDecoder> qvJoinSegments(const std::vector<std::unique_ptr<QvInputSegment>>& segments,
+                                               QvEncodePipe* output);
