@@ -1,0 +1,268 @@
+#include "core/transcode/batch/qvbatchtask.h"
+
+#include <random>
+
+#include "core/document/xmldom.h"
+#include "core/engine/status.h"
+#include "core/transcode/batch/qvbatchdecoder.h"
+#include "core/transcode/batch/qvtaskfile.h"
+#include "core/transcode/link/translink.h"
+#include "tests/core/transcode/batch/joinedtask.h"
+
+namespace {
+
+const QvFramerate f25 = QvFramerate::f25p(), f50 = QvFramerate::f50p();
+
+std::vector<int> steps(int first, int count, int step = 1) {
+    std::vector<int> all;
+    for (int i = 0; i < count; ++i) all.push_back(first + i * step);
+    return all;
+}
+
+template <class T>
+std::vector<T> operator+(std::vector<T> a, const std::vector<T>& b) {
+    a.insert(a.end(), b.begin(), b.end());
+    return a;
+}
+
+// Two sizes, two rates, two sample rates, and sound that ends before or after its picture.
+class Joined : public JoinedTask {
+  protected:
+    void addBoth(const AnyDict& picture, const AnyDict& sound, std::optional<InOutPoints> points = {}) {
+        add(AnyVector(source(1, picture, points), source(2, sound, points)), AnyVector(picture, sound));
+    }
+    AnyDict missing() { return entry(folder_.file("none.wav"), AnyDict()); }
+
+    AnyDict a_ = film("a.yuv", 10, 10, f25, 16, 8), aSound_ = sound("a.wav", 19200, 1000, 48000);
+    AnyDict b_ = film("b.yuv", 20, 100, f50, 64, 32), bSound_ = sound("b.wav", 26460, 2000, 44100);
+    AnyDict short_ = sound("s.wav", 9600, 3000, 48000);
+};
+
+// From the file of a task to the bytes of its output.
+TEST_F(Joined, SegmentsOfDifferentFormatsComeOutAsOne) {
+    const AnyDict card = entry(
+        "card.tg",
+        AnyDict(
+            "name", "testgen", "streams",
+            AnyDict("vids", AnyVector(Any(AnyDict("framerate", f25, "width", 64, "height", 48, "frames", 5))),
+                    "auds", AnyVector(Any(AnyDict("duration", 0.2))))));
+    addBoth(a_, aSound_);
+    addBoth(a_, missing());
+    state_.setSegmentEnabled(1, false);
+    addBoth(b_, bSound_);
+    addBoth(card, card);
+    addBoth(a_, short_);
+    const std::string file = folder_.file("task.xml");
+    ASSERT_EQ(XmlParser::storeDict(file.c_str(), state_, "TranscodeTask", "2.0"), 0);
+    Open open;
+    QvEncodePipe* pipe = nullptr;
+    QvTaskFault fault;
+    std::unique_ptr<QvTask> task(QvTaskFile::open(file.c_str(), open.decoders, &pipe, nullptr, &fault));
+    ASSERT_TRUE(task) << fault.path << ": " << fault.reason;
+    open.pipe.reset(pipe);
+    std::string first;
+    for (int pass = 0; pass < 2; ++pass) {  // a task runs as often as it is wanted
+        std::string error;
+        EXPECT_EQ(run(*task, &error), 0) << error;
+        const std::vector<int> shown = levels(written(".raw"));
+        ASSERT_EQ(shown.size(), 35u);
+        EXPECT_EQ(std::vector<int>(shown.begin(), shown.begin() + 20), steps(10, 10) + steps(100, 10, 2));
+        for (int i = 20; i < 25; ++i) EXPECT_EQ(shown[static_cast<std::size_t>(i)], -1) << "a test card";
+        EXPECT_EQ(std::vector<int>(shown.begin() + 25, shown.end()), steps(10, 10));
+        const std::vector<int> heard = samples(written(".wav").substr(80));
+        ASSERT_EQ(heard.size(), 35u * 1920);
+        for (std::size_t i = 0; i < 19200; ++i) ASSERT_EQ(heard[i], 1000) << i;
+        for (std::size_t i = 19200 + 50; i < 38400; ++i) ASSERT_NEAR(heard[i], 2000, 1) << i;
+        for (std::size_t i = 48000; i < 57600; ++i) ASSERT_EQ(heard[i], 3000) << i;
+        for (std::size_t i = 57600; i < 67200; ++i) ASSERT_EQ(heard[i], 0) << i;
+        if (pass == 0) first = written(".wav");
+    }
+    EXPECT_EQ(written(".wav"), first);
+    task.reset();
+}
+
+TEST_F(Joined, CutsOfOneFileMeetToTheFrameAndSample) {
+    std::mt19937 random(5);
+    const AnyDict ramp = film("r.yuv", 100, 1, f25, 16, 8);
+    std::string counted;
+    for (std::uint64_t i = 0; i < 4 * 48000; ++i) counted += leBytes(i % 30011, 2);
+    const AnyDict count = entry(folder_.write("c.wav", riff(wavChunk("fmt ", wavFormat(1, 1, 48000, 16)) +
+                                                            wavChunk("data", counted))),
+                                AnyDict());
+    std::vector<int> pictures, heard;
+    for (int i = 0; i < 30; ++i) {
+        const int from = static_cast<int>(random() % 99), frames = 1 + static_cast<int>(random() % 10u);
+        const int to = std::min(from + frames, 100);
+        addBoth(ramp, count, cut(from / 25.0, to / 25.0));
+        for (int k = from; k < to; ++k) pictures.push_back(k + 1);
+        for (int k = from * 1920; k < to * 1920; ++k) heard.push_back(k % 30011);
+    }
+    const auto open = restore();
+    ASSERT_TRUE(open->task) << open->error;
+    EXPECT_EQ(open->task->batchDecoder()->nrFrames(0), static_cast<int>(pictures.size()));
+    EXPECT_EQ(run(*open->task), 0);
+    EXPECT_EQ(levels(written(".raw")), pictures);
+    EXPECT_TRUE(samples(written(".wav").substr(80)) == heard);
+}
+
+TEST_F(Joined, SegmentsThatCanNotBeOpenedAreLeftOutUnlessTheyMustNot) {
+    const AnyDict junk = entry(folder_.write("junk.wav", "no sound"), AnyDict());
+    addBoth(a_, missing());
+    addBoth(a_, aSound_);
+    addBoth(b_, junk);
+    addBoth(b_, bSound_);
+    state_.setSegmentEnabled(3, false);
+    const auto statuses = [](const QvBatchTask& task) {
+        std::string all;
+        for (int i = 0; i < task.nrSegments(); ++i) all += std::to_string(task.segment(i).status) + " ";
+        return all;
+    };
+    {
+        LogCapture log;
+        const auto open = restore();
+        ASSERT_TRUE(open->task);
+        EXPECT_EQ(statuses(*open->task), "-1 0 -1 0 ");
+        EXPECT_TRUE(open->task->usesBatchDecoder());
+        EXPECT_EQ(open->task->indexOfActualSegment(1), 3);
+        EXPECT_TRUE(log.contains("[Task] Cannot add input segment 2"));
+        EXPECT_TRUE(log.contains("[Task] * Failed to open required input file(s) for 2 input segment(s)."));
+    }
+    {
+        LogCapture log;
+        const auto open = restore(QvBatchTask::skipDisabled);
+        ASSERT_TRUE(open->task);
+        EXPECT_EQ(statuses(*open->task), "-1 0 -1 1 ");
+        EXPECT_FALSE(open->task->usesBatchDecoder());
+        EXPECT_EQ(open->task->indexOfActualSegment(0), 1);
+        EXPECT_EQ(open->task->indexOfActualSegment(1), -1);
+        EXPECT_FALSE(log.contains("b.wav"));
+        EXPECT_TRUE(log.contains("[Task] + Skipped because disabled"));
+        EXPECT_EQ(run(*open->task), 0);
+        EXPECT_EQ(levels(written(".raw")), steps(10, 10));
+    }
+    const auto strict = restore(QvBatchTask::everySegmentOpens);
+    EXPECT_FALSE(strict->task || strict->pipe || !strict->decoders.empty());
+    EXPECT_NE(strict->error.find("none.wav' in input segment 0"), std::string::npos) << strict->error;
+    state_.setSegmentEnabled(1, false);
+    QvBatchTask task;
+    QvDPipeList decoders;
+    QvEncodePipe* pipe = nullptr;
+    EXPECT_EQ(task.restore(state_, decoders, &pipe, QvBatchTask::skipDisabled), QvStatus::noSegment);
+    EXPECT_TRUE(!pipe && decoders.empty() && task.nrLinks() == 0 && !task.encoder());
+}
+
+TEST_F(Joined, AStreamThatTheFileLacksFailsItsSegment) {
+    add(AnyVector(source(1, a_), source(2, aSound_, {}, 3)), AnyVector(a_, aSound_));
+    addBoth(b_, bSound_);
+    const auto open = restore();
+    ASSERT_TRUE(open->task);
+    EXPECT_EQ(open->task->segment(0).status, QvInputSegment::failed);
+    EXPECT_FALSE(open->task->usesBatchDecoder());
+}
+
+TEST_F(Joined, AFileThatIsNotListedIsOpenedWithTheDefaultsOfItsKind) {
+    add(AnyVector(source(1, a_), source(2, aSound_)), AnyVector(Any(a_)));
+    addBoth(b_, bSound_);
+    LogCapture log;
+    const auto open = restore(QvBatchTask::everySegmentOpens);
+    ASSERT_TRUE(open->task) << open->error;
+    EXPECT_TRUE(log.contains("File open data not found in input files section. Using default open for"));
+    EXPECT_EQ(run(*open->task), 0);
+    EXPECT_EQ(levels(written(".raw")).size(), 20u);
+}
+
+// One decoder serves a file, unless a stream of it is used twice; a slot that nothing feeds stays empty.
+TEST_F(Joined, DecodersAreSharedWithinASegment) {
+    state_.set("encoder", output(3));
+    const auto streams = [&](const AnyDict& picture, const AnyDict& sound) {
+        return AnyVector(source(1, picture), source(2, sound), source(2, sound), source(2, aSound_));
+    };
+    add(streams(a_, aSound_), AnyVector(a_, aSound_));
+    add(streams(b_, bSound_), AnyVector(b_, bSound_));
+    state_.get("streams").asVector().at(3).asDict().set("sources", AnyVector());
+    state_.remove("#nsegs");
+    const auto open = restore();
+    ASSERT_TRUE(open->task) << open->error;
+    EXPECT_EQ(open->task->nrSegments(), 2);
+    EXPECT_EQ(open->task->segment(0).decoders.size(), 3);
+    EXPECT_EQ(open->decoders.size(), 6);
+    EXPECT_EQ(open->task->segment(1).streams.size(), 4u);
+    EXPECT_EQ(open->task->nrLinks(), 3);
+    EXPECT_EQ(run(*open->task), 0);
+    EXPECT_EQ(levels(written(".raw")).size(), 20u);
+    state_.removeSegment(1);
+    const auto single = restore();
+    ASSERT_TRUE(single->task);
+    EXPECT_EQ(single->task->nrLinks(), 3);
+}
+
+TEST_F(Joined, TheStreamsOfASegmentEndTogether) {
+    addBoth(a_, bSound_);  // sound of another file, too long
+    addBoth(a_, short_);
+    const auto open = restore();
+    ASSERT_TRUE(open->task);
+    EXPECT_EQ(open->task->segment(0).streams[1]->effectiveDuration(), MediaTime(0.4));
+    EXPECT_EQ(open->task->segment(1).streams[1]->effectiveDuration(), MediaTime(0.2));
+    EXPECT_EQ(open->task->checkDurations(), 0);
+    EXPECT_EQ(open->task->segment(0).streams[1]->effectiveDuration(), MediaTime(0.4));
+}
+
+TEST_F(Joined, AStateThatIsNoTaskIsRefused) {
+    addBoth(a_, aSound_);
+    addBoth(b_, bSound_);
+    const QvTaskState sound = state_;
+    const auto refusal = [&] {
+        std::string error, text = failureOf([&] {
+                               const auto open = restore();
+                               EXPECT_FALSE(open->task);
+                               error = open->error;
+                           });
+        if (!error.empty()) text = error;
+        state_ = sound;
+        return text;
+    };
+    state_.remove("streams");
+    EXPECT_EQ(refusal(), "QvBatchTask::initFromState - invalid task struct, no output streams defined.");
+    state_.get("streams").asVector().at(0).asDict().get("sources").asVector().remove(0);
+    state_.remove("#nsegs");
+    EXPECT_EQ(refusal(),
+              "[Task] BatchTask.initFromState: No input segments defined, invalid task structure.");
+    state_.get("encoder").asDict().set("profile", 4);
+    EXPECT_EQ(refusal(), "Cannot restore - base profile 4 () not available.");
+    state_.get("encoder").asDict().get("streams").asVector().at(0).asDict().set("type", 2);
+    EXPECT_NE(refusal(), "no failure");
+    QvBatchTask task;
+    EXPECT_NE(failureOf([&] { task.segment(0); }), "no failure");
+}
+
+// Files are open only while their segment is read.
+TEST_F(Joined, ManySegmentsNeedFewOpenFiles) {
+    for (int i = 0; i < 150; ++i) addBoth(i % 2 == 0 ? a_ : b_, i % 3 == 0 ? aSound_ : bSound_);
+    const auto openFiles = [] {
+        int count = 0;
+        for ([[maybe_unused]] const auto& one : std::filesystem::directory_iterator("/proc/self/fd")) ++count;
+        return count;
+    };
+    struct Watching : QvTranscoder {
+        using QvTranscoder::QvTranscoder;
+        ~Watching() override { stop(); }
+        int cbProcess() override {
+            most = std::max(most, look());
+            return 0;
+        }
+        std::function<int()> look;
+        int most = 0;
+    };
+    const int before = openFiles();
+    const auto open = restore(QvBatchTask::everySegmentOpens);
+    ASSERT_TRUE(open->task) << open->error;
+    EXPECT_LE(openFiles(), before + 8);
+    Watching transcoder(open->task.get());
+    transcoder.look = openFiles;
+    transcoder.setParam("startDelay", 0);
+    EXPECT_EQ(transcoder.transcode(true), 0) << transcoder.errorDesc();
+    EXPECT_LE(transcoder.most, before + 24);
+    EXPECT_EQ(levels(written(".raw")).size(), 1500u);
+}
+
+}  // namespace
