@@ -138,6 +138,37 @@ TEST_F(Joined, SeamsDoNotAddUpTheirRounding) {
     for (std::size_t i = 0; i < heard.size(); ++i) ASSERT_EQ(got[i], heard[i]) << i;
 }
 
+TEST_F(Joined, SoundAloneIsAsLongAsItsSegments) {
+    state_.set("encoder", output(1, QvFramerate(0.0)));
+    add(AnyVector(source(2, aSound_, cut(0.1, 0.2))), AnyVector(Any(aSound_)));
+    add(AnyVector(source(2, short_)), AnyVector(Any(short_)));
+    add(AnyVector(source(2, aSound_, cut(0.3, 0.30625))), AnyVector(Any(aSound_)));
+    const auto open = restore();
+    ASSERT_TRUE(open->task) << open->error;
+    EXPECT_EQ(run(*open->task), 0);
+    EXPECT_EQ(samples(written(".wav").substr(80)),
+              std::vector<int>(4800, 1000) + std::vector<int>(9600, 3000) + std::vector<int>(300, 1000));
+}
+
+// Without a map both channels are mixed.
+TEST_F(Joined, TheChannelMapOfASourceHolds) {
+    std::string both;
+    for (int i = 0; i < 19200; ++i) both += leBytes(100, 2) + leBytes(200, 2);
+    const AnyDict stereo = entry(
+        folder_.write("two.wav", riff(wavChunk("fmt ", wavFormat(1, 2, 48000, 16)) + wavChunk("data", both))),
+        AnyDict());
+    addBoth(a_, stereo);
+    addBoth(a_, stereo);
+    AnyDict& second =
+        state_.get("streams").asVector().at(1).asDict().get("sources").asVector().at(1).asDict();
+    second.set("process", AnyDict("audioChannelMap", AnyVector(Any(AnyDict("channel", 1)))));
+    const auto open = restore();
+    ASSERT_TRUE(open->task) << open->error;
+    EXPECT_EQ(run(*open->task), 0);
+    EXPECT_EQ(samples(written(".wav").substr(80)),
+              std::vector<int>(19200, 150) + std::vector<int>(19200, 200));
+}
+
 TEST_F(Joined, SegmentsThatCanNotBeOpenedAreLeftOutUnlessTheyMustNot) {
     const AnyDict junk = entry(folder_.write("junk.wav", "no sound"), AnyDict());
     addBoth(a_, missing());
