@@ -21,13 +21,14 @@ QvDecodePipe* QvDPipeList::findByFilename(const Any& name, const QvDecodePipe* a
     return nullptr;
 }
 
+// Sorted, so that those that are there twice are next to each other.
 void QvDPipeList::deleteAll() {
+    sortByAddress();
     while (!empty()) {
-        const std::unique_ptr<QvDecodePipe> first(at(0));
-        for (int i = size(); i-- > 0;)
-            if (at(i) == first.get()) remove(i);
+        const std::unique_ptr<QvDecodePipe> last(back());
+        while (!empty() && back() == last.get()) remove(size() - 1);
         try {
-            first->close();
+            last->close();
         } catch (const std::bad_alloc&) {  // its destructor does the rest
         }
     }

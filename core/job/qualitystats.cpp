@@ -2,33 +2,28 @@
 
 #include <cstdio>
 #include <cstring>
+#include <string>
 #include <vector>
 
 #include "core/engine/files/qvfileutil.h"
 #include "core/engine/log/qvlog.h"
 #include "core/engine/status.h"
+#include "core/job/qualitytext_p.h"
 #include "core/stream/qvbufstrm.h"
 
 namespace {
 
-struct FrameStats {
-    unsigned bytes = 0;
-    std::vector<double> values;
-};
-
-void writeFrames(std::FILE* file, const std::vector<FrameStats>& frames) {
-    for (std::size_t i = 0; i < frames.size(); ++i) {
-        std::fprintf(file, "%zu\t%u", i, frames[i].bytes);
-        for (const double value : frames[i].values) std::fprintf(file, "\t%.4f", value);
-        std::fputc('\n', file);
-    }
+std::string textFor(const Any& name, const std::vector<QualityFrame>& frames) {
+    const Any extension = QvFile::getExt(name, true).toString();
+    if (extension == "csv") return qvQualityCsv(frames);
+    return extension == "json" ? qvQualityJson(frames) : qvQualityLines(frames);
 }
 
-bool writeFile(const Any& name, const std::vector<FrameStats>& frames) {
+bool writeFile(const Any& name, const std::vector<QualityFrame>& frames) {
     auto* file = static_cast<std::FILE*>(qvfopen(name, "w"));
     if (!file) return false;
-    writeFrames(file, frames);
-    const bool failed = std::ferror(file) != 0;
+    const std::string text = textFor(name, frames);
+    const bool failed = std::fwrite(text.data(), 1, text.size(), file) != text.size();
     return std::fclose(file) == 0 && !failed;
 }
 
@@ -39,7 +34,7 @@ struct QvPSNRLogger::Private : QvAuxInfoObserver {
     QvBufStream* stream = nullptr;
     QvEncodingQualityStatsSetup setup;
     std::vector<double> pending;
-    std::vector<FrameStats> frames;
+    std::vector<QualityFrame> frames;
 
     void auxInfo(unsigned, unsigned id, void* info, unsigned size) override {
         if (id == QvAuxId::STATISTIC_INFO && info) {

@@ -17,9 +17,10 @@ class QV_API QvEncodingQualityStatsSetup : public AnyVector {
     void addLog(const Any& filename) { append(AnyDict("filename", filename)); }
 };
 
-// Collects what an encoder reports of its frames on its bitstream, and writes it as text: one line a frame,
-// with the frame's number, its size in bytes, and the values of its statistics (doubles, for PSNR in dB) in
-// the order in which the encoder gives them.
+// Collects what an encoder reports of its frames on its bitstream, and writes it by the extension of the
+// log's name: "csv"; "json", with the mean of all frames; any other, a line a frame with tabs. Each frame has
+// its number, its size in bytes, and the statistics (doubles) in the order in which the encoder gives them:
+// PSNR in dB of up to three planes, then as many SSIM. An odd number of them is PSNR alone.
 class QV_API QvPSNRLogger {
   public:
     QvPSNRLogger();

@@ -58,6 +58,6 @@ class QV_API QvFormatMatcher {
 
   private:
     int properties_;
-    int second_;
+    [[maybe_unused]] int second_;
     const AnyDict* presetMeta_;  // null for none
 };

@@ -54,6 +54,11 @@ void QvPreset::setDisabled(bool on) { set("disabled", on ? 1 : 0); }
 AnyDict QvPreset::muxerParams() const { return getDict("muxer", AnyDict()); }
 AnyVector QvPreset::programs() const { return getVector("programs", AnyVector()); }
 
+std::optional<QvPresetMeta> QvPreset::presetMeta() const {
+    const Any& meta = get("PresetMeta");
+    return meta.isDict() ? std::optional<QvPresetMeta>(meta.asDict()) : std::nullopt;
+}
+
 void QvPreset::setInfo(const Any& text) {
     QV_ASSERT_MSG(text.isText(), "QvPreset.setInfo: invalid argument");
     set("info", text);

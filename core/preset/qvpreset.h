@@ -4,10 +4,13 @@
 //
 // Keys: "profile", "name", "custom" (0 built-in, 1 a user's), optional "shortName", "info", "disabled";
 // built-in: "videoCodecs", "audioCodecs", "muxers" (module names, the first is the default); a user's:
-// "muxer", "streams", "programs", "extension". Keys that begin with "#" are marks of the running program.
+// "muxer", "streams", "programs", "extension"; optional "PresetMeta", see QvPresetMeta. Keys that begin with "#" are marks of the running program.
 #pragma once
 
+#include <optional>
+
 #include "core/arch/api.h"
+#include "core/preset/qvpresetmeta.h"
 #include "core/value/any.h"
 #include "core/value/anycontainer.h"
 
@@ -33,6 +36,7 @@ class QV_API QvPreset : public AnyDict {
     Any postprocessCmd() const;
     AnyDict muxerParams() const;
     AnyVector programs() const;
+    std::optional<QvPresetMeta> presetMeta() const;  // "PresetMeta", if it is there
 
     // The modules that are allowed, by way of the base preset for a user's; empty when that is missing.
     AnyVector muxers() const { return allowed("muxers"); }

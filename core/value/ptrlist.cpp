@@ -1,5 +1,8 @@
 #include "core/value/ptrlist.h"
 
+#include <algorithm>
+#include <functional>
+
 #include "core/arch/qvassert.h"
 #include "core/value/anycontainer.h"
 
@@ -16,6 +19,8 @@ AnyVector PtrListImp::toVector() const {
     for (int i = 0; i < size(); ++i) result.append(Any(static_cast<const void*>(at(i))));
     return result;
 }
+
+void PtrListImp::sortByAddress() { std::sort(array_.begin(), array_.end(), std::less<>()); }
 
 void PtrListImp::append(void* pointer) { array_.push_back(pointer); }
 

@@ -34,6 +34,7 @@ class QV_API PtrListImp {
     void insert(int index, void* pointer);  // in front of `index`; -1 appends; else an assertion
     void* remove(int index);                // what was taken out, null outside the range
     int find(const void* pointer) const;    // the first index, or -1
+    void sortByAddress();                   // takes no memory
     void* const* data() const { return array_.data(); }
 
   private:

@@ -24,6 +24,8 @@ void getPointer(const Settings& settings, Any& value) {
 template <void* Settings::*member>
 constexpr QvParamAccess<Settings> pointerTo{setPointer<member>, getPointer<member>};
 
+void always(const Settings&, Any& value) { value = 1; }
+
 constexpr QvParamRow<Settings> rows[] = {
     {.name = "context",
      .member = pointerTo<&Settings::context>,
@@ -35,6 +37,11 @@ constexpr QvParamRow<Settings> rows[] = {
      .flags = qvParamStored,
      .help = "a QvUserDataCallback, called with each frame",
      .type = Any::Generic},
+    {.name = "takesUserData",
+     .member = QvParamAccess<Settings>{nullptr, always},
+     .flags = qvParamReadOnly,
+     .help = "sources are to read their user data",
+     .type = Any::Int32},
 };
 static_assert(qvParamTableOk<Settings>(rows));
 

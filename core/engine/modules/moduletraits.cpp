@@ -30,6 +30,7 @@ constexpr Row fixedNames[] = {
     {"rawaenc", {.uncompressed = true}},
     {"rawvenc", {.uncompressed = true}},
     {"mj2kvenc", {.wholePictures = true}},
+    {"mpegvenc", {.matchesGop = true}},
 };
 
 constexpr struct {
@@ -41,6 +42,7 @@ constexpr struct {
     {"convertsRate", &ModuleTraits::convertsRate},   {"delays", &ModuleTraits::delays},
     {"deinterlaces", &ModuleTraits::deinterlaces},   {"repeatsFrames", &ModuleTraits::repeatsFrames},
     {"uncompressed", &ModuleTraits::uncompressed},   {"wholePictures", &ModuleTraits::wholePictures},
+    {"matchesGop", &ModuleTraits::matchesGop},
 };
 
 constexpr struct {

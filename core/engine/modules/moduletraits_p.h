@@ -39,6 +39,8 @@ struct ModuleTraits {
     bool uncompressed = false;
     // "wholePictures" (Int32): an encoder each of whose blocks is a picture that can be a file by itself.
     bool wholePictures = false;
+    // "matchesGop" (Int32): an encoder whose groups of pictures can be fitted to those of an MPEG source.
+    bool matchesGop = false;
 
     bool operator==(const ModuleTraits&) const = default;
 };

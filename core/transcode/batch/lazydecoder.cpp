@@ -1,3 +1,4 @@
+#include <algorithm>
 #include <cstring>
 #include <string>
 #include <utility>
@@ -15,7 +16,7 @@ namespace {
 struct Place {
     bool selected = false;
     long long next = 0;
-    bool sought = false;  // `next` is not where an open source begins
+    bool sought = false;  // `next` may not be where the source stands when it is opened
     int fault = 0;        // of the last attempt to go there
 };
 
@@ -33,6 +34,7 @@ struct LazyDecoder::Source {
     std::unique_ptr<QvDecodePipe> decoder;  // while it is open
     OpenDecoders::Order::iterator own;      // with a decoder that is not for good
     bool forGood = false;
+    bool spoiled = false;  // it has failed, so nobody else takes it over
     std::vector<Place> video, audio, subpic;
 
     std::vector<Place>& of(int type) {
@@ -44,20 +46,54 @@ struct LazyDecoder::Source {
                    ? &all[static_cast<std::size_t>(number)]
                    : nullptr;
     }
-    // Selection and positions into a decoder that has just been opened.
-    void takeUp() {
+    bool anySelected() {
+        for (const int type : {qvVideoStream, qvAudioStream, qvSubpicStream})
+            for (const Place& place : of(type))
+                if (place.selected) return true;
+        return false;
+    }
+    void go(int type, int number) {
+        Place& place = *this->place(type, number);
+        if (!place.sought || type == qvSubpicStream) return;
+        place.fault = type == qvVideoStream ? decoder->seekToFrame(place.next, number)
+                                            : decoder->seekToSample(place.next, number);
+    }
+    // Selection and positions into a decoder that has just been opened, or was in use elsewhere.
+    void takeUp(bool used) {
         for (const int type : {qvVideoStream, qvAudioStream, qvSubpicStream})
             for (std::size_t i = 0; i < of(type).size(); ++i) {
                 Place& place = of(type)[i];
                 const int number = static_cast<int>(i);
+                place.sought |= used;
                 if (place.selected != decoder->isSelected(type, number))
                     place.selected ? decoder->select(type, number) : decoder->deselect(type, number);
-                if (!place.sought || type == qvSubpicStream) continue;
-                place.fault = type == qvVideoStream ? decoder->seekToFrame(place.next, number)
-                                                    : decoder->seekToSample(place.next, number);
+                if (place.selected) go(type, number);
             }
+        spoiled = false;
     }
 };
+
+// --- The open sources of a task.
+
+void OpenDecoders::makeRoom() {
+    while (count() >= limit_) {
+        if (!idle_.empty())
+            idle_.pop_back();
+        else
+            order_.back()->rest();
+    }
+}
+
+std::unique_ptr<QvDecodePipe> OpenDecoders::take(const std::shared_ptr<const SourceFacts>& facts) {
+    const auto found =
+        std::find_if(idle_.begin(), idle_.end(), [&](const Idle& idle) { return idle.facts == facts; });
+    if (found == idle_.end()) return nullptr;
+    std::unique_ptr<QvDecodePipe> decoder = std::move(found->decoder);
+    idle_.erase(found);
+    return decoder;
+}
+
+// --- One of them.
 
 LazyDecoder::LazyDecoder(std::shared_ptr<OpenDecoders> others, std::shared_ptr<const SourceFacts> facts,
                          Opener opener)
@@ -80,15 +116,22 @@ LazyDecoder::~LazyDecoder() {
 
 bool LazyDecoder::isAwake() const { return source_->decoder != nullptr; }
 
-void LazyDecoder::rest() {
-    if (!source_->decoder || source_->forGood) return;
+void LazyDecoder::leave() {
     if (source_->own != others_->order_.end()) others_->order_.erase(source_->own);
     source_->own = others_->order_.end();
+}
+
+void LazyDecoder::rest() {
+    if (!source_->decoder || source_->forGood) return;
+    leave();
     source_->decoder.reset();  // which closes it
 }
 
-void LazyDecoder::makeRoom() const {
-    while (others_->count() >= others_->limit_) others_->order_.back()->rest();
+void LazyDecoder::giveUp() {
+    if (!source_->decoder || source_->forGood) return;
+    if (source_->spoiled) return rest();
+    leave();
+    others_->keep({source_->facts, std::move(source_->decoder)});
 }
 
 QvDecodePipe* LazyDecoder::awake() const {
@@ -98,12 +141,16 @@ QvDecodePipe* LazyDecoder::awake() const {
         if (source.own != order.end()) order.splice(order.begin(), order, source.own);
         return source.decoder.get();
     }
-    makeRoom();
-    std::unique_ptr<QvDecodePipe> opened(source.opener());
+    std::unique_ptr<QvDecodePipe> opened = others_->take(source.facts);
+    const bool used = opened != nullptr;
+    if (!used) {
+        others_->makeRoom();
+        opened.reset(source.opener());
+    }
     if (!opened) return nullptr;
     source.own = order.insert(order.begin(), const_cast<LazyDecoder*>(this));
     source.decoder = std::move(opened);
-    source.takeUp();
+    source.takeUp(used);
     return source.decoder.get();
 }
 
@@ -115,15 +162,14 @@ QvDecodePipe& LazyDecoder::mustBeAwake() const {
 
 QvDecodePipe& LazyDecoder::forGood() const {
     QvDecodePipe& decoder = mustBeAwake();
-    if (!std::exchange(source_->forGood, true)) {
-        others_->order_.erase(source_->own);
-        source_->own = others_->order_.end();
-    }
+    if (!std::exchange(source_->forGood, true)) others_->order_.erase(source_->own);
+    source_->own = others_->order_.end();
     return decoder;
 }
 
 int LazyDecoder::copyError(int result) {
     if (result >= 0 || result == QvStatus::endOfStream) return result;
+    source_->spoiled = true;
     return setError(result, "%s", source_->decoder->errorDesc());
 }
 
@@ -219,6 +265,7 @@ int LazyDecoder::select(int type, int stream) {
     if (source_->decoder || !place) {
         const int result = mustBeAwake().select(type, stream);
         if (result != QvStatus::ok || !place) return copyError(result);
+        if (!place->selected) source_->go(type, stream);
     }
     place->selected = true;
     return QvStatus::ok;
@@ -231,6 +278,7 @@ int LazyDecoder::deselect(int type, int stream) {
         if (result != QvStatus::ok || !place) return copyError(result);
     }
     place->selected = false;
+    if (!source_->anySelected()) giveUp();
     return QvStatus::ok;
 }
 

@@ -5,25 +5,38 @@
 #include <functional>
 #include <list>
 #include <memory>
+#include <utility>
 
 #include "core/decode/qvdecoder.h"
 #include "core/transcode/batch/sourcefacts_p.h"
 
 class LazyDecoder;
 
-// Which of a task's decoders are open: past the limit, the one that was not read for longest is closed.
+// Which of a task's sources are open. Past the limit one is closed that nobody reads, or else the one that
+// was not read for longest.
 class OpenDecoders {
   public:
     // Several decoders are read in turn; `limit` is above their number.
     explicit OpenDecoders(int limit) : limit_(limit) {}
 
-    int count() const { return static_cast<int>(order_.size()); }
+    int count() const { return static_cast<int>(order_.size() + idle_.size()); }
 
   private:
     friend class LazyDecoder;
     using Order = std::list<LazyDecoder*>;
 
-    Order order_;  // the last one read is the first
+    struct Idle {
+        std::shared_ptr<const SourceFacts> facts;
+        std::unique_ptr<QvDecodePipe> decoder;
+    };
+
+    void makeRoom();
+    void keep(Idle idle) { idle_.push_front(std::move(idle)); }
+    // An open decoder of that source, or null.
+    std::unique_ptr<QvDecodePipe> take(const std::shared_ptr<const SourceFacts>& facts);
+
+    Order order_;           // the last one read is the first
+    std::list<Idle> idle_;  // the last one that was in use is the first
     int limit_;
 };
 
@@ -40,7 +53,8 @@ class LazyDecoder : public QvDecodePipe {
     ~LazyDecoder() override;
 
     bool isAwake() const;
-    void rest();  // closes the source, unless it is open for good
+    void rest();    // closes the source, unless it is open for good
+    void giveUp();  // leaves the source, unless it is open for good, to the next decoder of the same file
 
     using QvDecodePipe::getParam;
     using QvDecodePipe::getStreamParam;
@@ -91,6 +105,6 @@ class LazyDecoder : public QvDecodePipe {
     QvDecodePipe& mustBeAwake() const;  // asserts that it can
     QvDecodePipe& forGood() const;      // the same, and it stays open
     int refuse() const;                 // what a call gives that found the source gone
-    void makeRoom() const;
+    void leave();
     int copyError(int result);
 };

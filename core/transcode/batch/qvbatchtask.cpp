@@ -219,7 +219,7 @@ void QvBatchTask::linkJoined() {
     for (const int type : {qvVideoStream, qvAudioStream})
         for (std::size_t i = 0; i < first.streams.size(); ++i) {
             if (!first.streams[i]->decoder || first.streams[i]->type != type) continue;
-            const int number = encoder()->streamNr(encoder()->streamAt(static_cast<int>(i)));
+            const int number = qvOutputNumber(*encoder(), *first.streams[i], i);
             int& next = numbers[type == qvVideoStream ? 0 : 1];
             QV_ASSERT_MSG(link(batchDecoder_.get(), type, next++, number) >= 0, unhandled);
         }
@@ -229,11 +229,8 @@ void QvBatchTask::linkSegment(const QvInputSegment& segment) {
     QV_ASSERT_MSG(segment.status == QvInputSegment::opened, "BatchTask.restore: invalid segment open status");
     for (std::size_t i = 0; i < segment.streams.size(); ++i) {
         const QvIStream& stream = *segment.streams[i];
-        const int index = static_cast<int>(i);
-        QV_ASSERT_MSG(index < encoder()->nrStreams() && encoder()->streamAt(index)->type == stream.type,
-                      "BatchTask.restore: invalid stream ordering");
         if (!stream.decoder) continue;
-        const int number = encoder()->streamNr(encoder()->streamAt(index));
+        const int number = qvOutputNumber(*encoder(), stream, i);
         QV_ASSERT_MSG(link(stream.decoder, stream.type, stream.number, number, stream.params) >= 0,
                       unhandled);
     }

@@ -434,8 +434,9 @@ QvTask* QvTaskFile::open(const Any& file, QvDPipeList& decoders, QvEncodePipe** 
     QvDPipeList opened;
     const int before = decoders.size();
     QvTaskFault found = guarded([&]() -> QvTaskFault {
-        QvTaskState state;
-        if (QvTaskFault first = checked(file, state); first.status != QvStatus::ok) return first;
+        AnyDict stored;
+        if (QvTaskFault first = checked(file, stored); first.status != QvStatus::ok) return first;
+        const QvTaskState state(stored);
         Any error;
         try {
             if (const int segments = state.nrSegments();

@@ -68,7 +68,7 @@ void insert(QvBatchDecoder& joined, const QvInputSegment& segment, QvEncodePipe&
         if (!segment.streams[i]->decoder || segment.streams[i]->type == qvSubpicStream) continue;
         QvIStream& copy = copies.emplace_back(*segment.streams[i]);
         if (copy.type != qvAudioStream) continue;
-        const int number = output.streamNr(output.streamAt(static_cast<int>(i)));
+        const int number = qvOutputNumber(output, copy, i);
         const int channels = encoderParam(output, "audio", number, "channels").asInt32(0);
         giveChannelMap(copy, output, number,
                        channels > 0 ? channels : AudioFormat(inputParams(copy)).channels);
@@ -79,6 +79,13 @@ void insert(QvBatchDecoder& joined, const QvInputSegment& segment, QvEncodePipe&
 }
 
 }  // namespace
+
+int qvOutputNumber(QvEncodePipe& output, const QvIStream& stream, std::size_t place) {
+    const int index = static_cast<int>(place);
+    QV_ASSERT_MSG(index < output.nrStreams() && output.streamAt(index)->type == stream.type,
+                  "BatchTask.restore: invalid stream ordering");
+    return output.streamNr(output.streamAt(index));
+}
 
 std::unique_ptr<QvBatchDecoder> qvJoinSegments(const Segments& segments, QvEncodePipe* output) {
     QV_ASSERT_MSG(segments.size() >= 2, "Why me d00d!?");
@@ -94,7 +101,7 @@ std::unique_ptr<QvBatchDecoder> qvJoinSegments(const Segments& segments, QvEncod
     for (std::size_t i = 0; i < (*first)->streams.size(); ++i) {
         const QvIStream& stream = *(*first)->streams[i];
         if (!stream.decoder) continue;
-        const int number = output->streamNr(output->streamAt(static_cast<int>(i)));
+        const int number = qvOutputNumber(*output, stream, i);
         if (stream.type == qvVideoStream)
             joined->addOutputVideoStream(videoJob(*output, number, VideoFormat(inputParams(stream))));
         else if (stream.type == qvAudioStream)

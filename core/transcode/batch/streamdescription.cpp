@@ -17,6 +17,7 @@ void qvDescribeVideo(const VideoJobDescription& job, int frames, AnyDict& params
     params.set("frameAspect", Any(job.outFrameAspect));
     params.set("FOURCC", Any(static_cast<int>(job.outFOURCC)));
     params.set("framerate", Any(job.outFramerate));
+    params.set("pal", Any(job.outFramerate.isPAL() ? 1 : 0));
     params.set("frames", Any(frames));
     params.set("duration", Any(seconds));
     params.set("vDuration", Any(seconds));

@@ -64,7 +64,8 @@ class QV_API QvTaskState : public AnyDict {
     };
 
     QvTaskState() = default;
-    QvTaskState(const AnyDict& dict) : AnyDict(dict) {}
+    // The segments of a dictionary from elsewhere are counted anew.
+    QvTaskState(const AnyDict& dict) : AnyDict(dict) { remove("#nsegs"); }
 
     // --- The task as a whole --------------------------------------------------------------------
 

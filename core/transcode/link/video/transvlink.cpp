@@ -104,6 +104,7 @@ int TransVLink::openWith(const LinkOpen& given) {
     smartRender_->negotiate(*decoder_, decStreamNr_, *encoder_, encStreamNr_, job_, videoPipe_.get(), *range_,
                             given.passPicture && !chapters);
     prepareMetaSources();
+    requestUserData();
     finished_ = false;
     framesWritten_ = 0;
     qualityLog_ = QualityLog::start(given.qualityStats, *encoder_, encStreamNr_);
@@ -183,6 +184,15 @@ void TransVLink::prepareMetaSources() {
         // It is read once a frame, whatever rate its own times are written at.
         if (source->decoder != decoder_) qvSetOptionalParam(*source->decoder, "readRate", job_.inFramerate);
     }
+}
+
+// Reading them may cost a source time, so it does only what is wanted.
+void TransVLink::requestUserData() {
+    bool wanted = encoder_->getParam(_encPar("takesUserData").asString()).isTrue();
+    for (int i = 0; videoPipe_ && i < videoPipe_->nrFilters() && !wanted; ++i)
+        wanted = videoPipe_->filter(i)->getParam("takesUserData").isTrue();
+    if (wanted && !decoder_->readUserData(qvVideoStream, decStreamNr_))
+        decoder_->setReadUserData(qvVideoStream, decStreamNr_, true);
 }
 
 int TransVLink::close() {

@@ -59,6 +59,7 @@ class QV_API TransVLink : public TransLink {
     int buildPipe();
     void _setTotalVDuration();
     void prepareMetaSources();
+    void requestUserData();
 
     void smartStep(Step& step);
     void pipeStep(Step& step);

@@ -27,16 +27,19 @@ class JoinedTask : public testing::Test {
 
     JoinedTask() { state_.set("encoder", output(1)); }
 
-    AnyDict output(int sounds) const {
+    // A rate of 0: sound alone.
+    AnyDict output(int sounds, const QvFramerate& rate = QvFramerate::f25p(), int samplerate = 48000) const {
         const std::unique_ptr<QvEncodePipe> pipe(QvEncodePipe::create());
         pipe->clearStreams();
-        pipe->addVideoStream("rawvenc");
-        pipe->videoEncoder(0)->setParamDict(AnyDict("type", static_cast<int>(QvFourcc::GRAY), "width", width,
-                                                    "height", height, "framerate", QvFramerate::f25p()));
+        if (rate.rate().ratio() > 0) {
+            pipe->addVideoStream("rawvenc");
+            pipe->videoEncoder(0)->setParamDict(AnyDict("type", static_cast<int>(QvFourcc::GRAY), "width",
+                                                        width, "height", height, "framerate", rate));
+        }
         for (int i = 0; i < sounds; ++i) {
             pipe->addAudioStream("rawaenc");
             pipe->audioEncoder(i)->setParamDict(
-                AnyDict("channels", 1, "bitsPerSample", 16, "samplerate", 48000));
+                AnyDict("channels", 1, "bitsPerSample", 16, "samplerate", samplerate));
         }
         AnyDict encoder;
         pipe->store(encoder);

@@ -23,14 +23,19 @@ struct Sources {
         Sources& all_;
     };
 
-    QvDecodePipe* make() { return gone ? nullptr : new Counted(*this); }
+    QvDecodePipe* make() {
+        if (gone) return nullptr;
+        auto* const made = new Counted(*this);
+        made->failAt = failAt;
+        return made;
+    }
     std::unique_ptr<LazyDecoder> lazy(const std::shared_ptr<OpenDecoders>& others) {
         auto decoder = std::make_unique<LazyDecoder>(others, facts, [this] { return make(); });
         EXPECT_EQ(decoder->open(), 0);
         return decoder;
     }
 
-    int open = 0, opened = 0, most = 0;
+    int open = 0, opened = 0, most = 0, failAt = -1;
     bool gone = false;
     std::shared_ptr<const SourceFacts> facts = [this] {
         const std::unique_ptr<QvDecodePipe> first(make());
@@ -105,6 +110,53 @@ TEST(LazyDecoder, TheOneThatWasReadLastStaysOpen) {
     EXPECT_FALSE(b->isAwake());
     EXPECT_EQ(b->readFrame(0), 0);
     EXPECT_EQ(b->getFramePtr(0)->frameNr, 1);
+}
+
+// A file that is cut into many segments is opened once.
+TEST(LazyDecoder, ASourceThatNobodyReadsGoesToTheNextDecoderOfItsFile) {
+    Sources sources, others;
+    const auto open = std::make_shared<OpenDecoders>(2);
+    const auto first = sources.lazy(open), second = sources.lazy(open), third = sources.lazy(open);
+    const auto other = others.lazy(open), more = others.lazy(open);
+    sources.opened = 0;
+    const auto finish = [](LazyDecoder& decoder) {
+        decoder.deselect(1, 0);
+        EXPECT_TRUE(decoder.isAwake());
+        decoder.deselect(2, 0);
+        EXPECT_FALSE(decoder.isAwake());
+    };
+    for (int i = 0; i < 5; ++i) first->readFrame(0);
+    finish(*first);
+    EXPECT_EQ(second->readFrame(0), 0);
+    EXPECT_EQ(second->getFramePtr(0)->frameNr, 0);
+    EXPECT_EQ(sources.opened, 1);
+    first->select(1, 0);
+    EXPECT_EQ(first->readFrame(0), 0);
+    EXPECT_EQ(first->getFramePtr(0)->frameNr, 5);
+    EXPECT_EQ(sources.opened, 2);
+    finish(*second);
+    EXPECT_EQ(other->readFrame(0), 0);
+    EXPECT_TRUE(first->isAwake()) << "what nobody reads is closed first";
+    EXPECT_EQ(sources.open, 1);
+    EXPECT_EQ(more->readFrame(0), 0);
+    EXPECT_FALSE(first->isAwake());
+    EXPECT_EQ(third->readFrame(0), 0);
+    EXPECT_EQ(third->getFramePtr(0)->frameNr, 0);
+}
+
+TEST(LazyDecoder, ASourceThatFailedIsNotTakenOver) {
+    Sources sources;
+    sources.failAt = 3;
+    const auto open = std::make_shared<OpenDecoders>(4);
+    const auto first = sources.lazy(open), second = sources.lazy(open);
+    sources.opened = 0;
+    for (int i = 0; i < 3; ++i) EXPECT_EQ(first->readFrame(0), 0);
+    EXPECT_EQ(first->readFrame(0), QvStatus::failed);
+    EXPECT_EQ(std::string(first->errorDesc()), "the disc is gone");
+    first->deselect(1, 0);
+    first->deselect(2, 0);
+    EXPECT_EQ(second->readFrame(0), 0);
+    EXPECT_EQ(sources.opened, 2);
 }
 
 // What has changed the source can't be done again, so it stays open beside the others.

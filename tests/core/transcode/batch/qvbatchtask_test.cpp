@@ -105,6 +105,70 @@ TEST_F(Joined, CutsOfOneFileMeetToTheFrameAndSample) {
     EXPECT_TRUE(samples(written(".wav").substr(80)) == heard);
 }
 
+// A frame of 1001/30000 s has 1471.47 samples of 44100 a second: no seam rounds for the next one.
+TEST_F(Joined, SeamsDoNotAddUpTheirRounding) {
+    const QvFramerate ntsc = QvFramerate::f29p();
+    state_.set("encoder", output(1, ntsc, 44100));
+    constexpr int frames = 200, period = 30011;
+    const auto sampleOf = [](int frame) { return static_cast<int>(44100LL * 1001 * frame / 30000); };
+    const AnyDict ramp = film("r.yuv", frames, 1, ntsc, 16, 8);
+    std::string counted;
+    for (int i = 0; i <= sampleOf(frames); ++i) counted += leBytes(static_cast<std::uint64_t>(i % period), 2);
+    const AnyDict count = entry(folder_.write("c.wav", riff(wavChunk("fmt ", wavFormat(1, 1, 44100, 16)) +
+                                                            wavChunk("data", counted))),
+                                AnyDict());
+    std::mt19937 random(9);
+    std::vector<int> pictures, heard;
+    for (int i = 0; i < 40; ++i) {
+        const int from = static_cast<int>(random() % (frames - 7)),
+                  length = 1 + static_cast<int>(random() % 7);
+        const auto at = [&](int frame) { return MediaTime(frame, ntsc, MediaTime::defaultTimescale); };
+        addBoth(ramp, count, InOutPoints(at(from), at(from + length)));
+        const int before = sampleOf(static_cast<int>(pictures.size()));
+        for (int k = 0; k < length; ++k) pictures.push_back(from + k + 1);
+        const int samples = sampleOf(static_cast<int>(pictures.size())) - before;
+        for (int k = 0; k < samples; ++k) heard.push_back((sampleOf(from) + k) % period);
+    }
+    const auto open = restore();
+    ASSERT_TRUE(open->task) << open->error;
+    EXPECT_EQ(run(*open->task), 0);
+    EXPECT_EQ(levels(written(".raw")), pictures);
+    const std::vector<int> got = samples(written(".wav").substr(80));
+    ASSERT_EQ(got.size(), heard.size());
+    for (std::size_t i = 0; i < heard.size(); ++i) ASSERT_EQ(got[i], heard[i]) << i;
+}
+
+TEST_F(Joined, SoundAloneIsAsLongAsItsSegments) {
+    state_.set("encoder", output(1, QvFramerate(0.0)));
+    add(AnyVector(source(2, aSound_, cut(0.1, 0.2))), AnyVector(Any(aSound_)));
+    add(AnyVector(source(2, short_)), AnyVector(Any(short_)));
+    add(AnyVector(source(2, aSound_, cut(0.3, 0.30625))), AnyVector(Any(aSound_)));
+    const auto open = restore();
+    ASSERT_TRUE(open->task) << open->error;
+    EXPECT_EQ(run(*open->task), 0);
+    EXPECT_EQ(samples(written(".wav").substr(80)),
+              std::vector<int>(4800, 1000) + std::vector<int>(9600, 3000) + std::vector<int>(300, 1000));
+}
+
+// Without a map both channels are mixed.
+TEST_F(Joined, TheChannelMapOfASourceHolds) {
+    std::string both;
+    for (int i = 0; i < 19200; ++i) both += leBytes(100, 2) + leBytes(200, 2);
+    const AnyDict stereo = entry(
+        folder_.write("two.wav", riff(wavChunk("fmt ", wavFormat(1, 2, 48000, 16)) + wavChunk("data", both))),
+        AnyDict());
+    addBoth(a_, stereo);
+    addBoth(a_, stereo);
+    AnyDict& second =
+        state_.get("streams").asVector().at(1).asDict().get("sources").asVector().at(1).asDict();
+    second.set("process", AnyDict("audioChannelMap", AnyVector(Any(AnyDict("channel", 1)))));
+    const auto open = restore();
+    ASSERT_TRUE(open->task) << open->error;
+    EXPECT_EQ(run(*open->task), 0);
+    EXPECT_EQ(samples(written(".wav").substr(80)),
+              std::vector<int>(19200, 150) + std::vector<int>(19200, 200));
+}
+
 TEST_F(Joined, SegmentsThatCanNotBeOpenedAreLeftOutUnlessTheyMustNot) {
     const AnyDict junk = entry(folder_.write("junk.wav", "no sound"), AnyDict());
     addBoth(a_, missing());

@@ -76,6 +76,33 @@ TEST(QvTaskFile, AFaultHasItsPlaceAndReason) {
         {"<key>rate", "interlaced=\"0\"", "interlaced=\"yes\"", "rate",
          "its 'interlaced' is no whole number of 32 bits", "<framerate"},
     };
+    const struct {
+        const char *what, *from, *to, *path, *reason;
+    } ofSegments[] = {
+        {"points that are no times", "<key>stream</key>",
+         "<key>process</key><dict><key>inOutPoints</key><vec><i32>1</i32><i32>2</i32></vec></dict>"
+         "<key>stream</key>",
+         "streams/1/sources/1/process/inOutPoints/1", "it is no time"},
+        {"half a pair of points", "<key>stream</key>",
+         "<key>process</key><dict><key>inOutPoints</key><vec><mediatime ticks=\"1\" "
+         "scale=\"1\"/></vec></dict>"
+         "<key>stream</key>",
+         "streams/1/sources/1/process/inOutPoints", "it holds no pairs of times"},
+        {"another number of segments", "<key>sources</key>\n      <vec>",
+         "<key>sources</key>\n      <vec><dict/>", "streams/2/sources",
+         "it has 1 segments, and another stream 2"},
+        {"flags of more segments", "<key>streams</key>\n  <vec>",
+         "<key>segments</key><vec><i32>1</i32><i32>1</i32></vec><key>streams</key>\n  <vec>", "segments",
+         "it does not have one number for each of the 1 segments"},
+        {"a flag that is no number", "<key>streams</key>\n  <vec>",
+         "<key>segments</key><vec><str>1</str></vec><key>streams</key>\n  <vec>", "segments/1",
+         "it is no number"},
+    };
+    for (const auto& row : ofSegments) {
+        const QvTaskFault fault = file.check(file.with("<key>files", row.from, row.to));
+        EXPECT_EQ(fault.path, row.path) << row.what;
+        EXPECT_EQ(fault.reason, row.reason) << row.what;
+    }
     for (const auto& row : rows) {
         const std::string changed = file.with(row.after, row.from, row.to);
         const QvTaskFault fault = file.check(changed);
@@ -90,6 +117,55 @@ TEST(QvTaskFile, AFaultHasItsPlaceAndReason) {
     EXPECT_EQ(QvTaskFile::check(file.folder.file("none.xml").c_str()).status, QvStatus::cannotParse);
     EXPECT_EQ(QvTaskFile::check(Any(7)).status, QvStatus::cannotParse);
     EXPECT_EQ(file.check("<doc/>").reason, "this is no task: its outermost element is 'doc'");
+}
+
+TEST(QvTaskFile, SeveralSegmentsAreABatchTask) {
+    const TaskFile file;
+    const std::string more = "<key>sources</key>\n      <vec>";
+    const std::size_t at = file.text.find("<dict>", file.text.find(more)), end = file.text.find("</vec>", at);
+    const std::string source = file.text.substr(at, end - at), wav = file.folder.file("in.wav");
+    std::string missing = source;
+    missing.replace(missing.find(wav), wav.size(), file.folder.file("none.wav"));
+    const struct {
+        const char* what;
+        std::string second, flags;
+        int options;
+        int segments;  // -1: a plain task, -2: none
+        const char* reason;
+    } rows[] = {
+        {"two", source, "", 3, 2, ""},
+        {"one", "", "", 3, -1, ""},
+        {"one, disabled", "", "0", 3, -2, "bailing out."},
+        {"one of two is missing", missing, "", 3, -2, "none.wav' in input segment 1"},
+        {"it may be missing", missing, "", 1, 2, ""},
+        {"a disabled one is missing", missing, "10", 3, 2, ""},
+        {"a count from elsewhere", source, "11<", 3, 2, ""},
+    };
+    for (const auto& row : rows) {
+        std::string text = file.text;
+        for (std::size_t from = 0; (from = text.find(more, from)) != std::string::npos; from += more.size())
+            text.insert(text.find("</vec>", text.find("<pair", from)), row.second);
+        std::string flags;
+        for (const char flag : row.flags.substr(0, row.flags.find('<')))
+            flags += std::string("<i32>") + flag + "</i32>";
+        if (!flags.empty())
+            text.insert(
+                text.find("  <key>streams</key>\n  <vec>"),
+                "<key>segments</key><vec>" + flags + "</vec>" +
+                    (row.flags.find('<') == std::string::npos ? "" : "<key>#nsegs</key><i32>7</i32>"));
+        file.folder.write("job.xml", text);
+        QvDPipeList decoders;
+        QvEncodePipe* pipe = nullptr;
+        QvTaskFault fault;
+        std::unique_ptr<QvTask> task(
+            QvTaskFile::open(file.name.c_str(), decoders, &pipe, nullptr, &fault, row.options));
+        const std::unique_ptr<QvEncodePipe> owned(pipe);
+        const auto* batch = dynamic_cast<const QvBatchTask*>(task.get());
+        EXPECT_EQ(!task ? -2 : batch ? batch->nrSegments() : -1, row.segments) << row.what;
+        EXPECT_NE(fault.reason.find(row.reason), std::string::npos) << row.what << ": " << fault.reason;
+        task.reset();
+        decoders.deleteAll();
+    }
 }
 
 // Whatever is done to a line: no exception, and what passes the check does not assert in a restore either.
