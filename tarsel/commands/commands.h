@@ -17,4 +17,6 @@ void addPresets(CommandLine& line);
 void addRecover(CommandLine& line);
 void addRun(CommandLine& line, Signals& signals, const std::string& version);
 void addTask(CommandLine& line, Signals& signals);
+void addCompare(CommandLine& line, Signals& signals);
+void addScope(CommandLine& line, Signals& signals);
 void addFrame(CommandLine& line, Signals& signals, const std::string& version);

@@ -153,6 +153,13 @@ constexpr Message kMessages[] = {
     {Msg::soundClipped,    Exit::done,   "audio stream {text} of {file} is clipped",            "{text} of its samples were beyond full scale",                          "lower it with --volume or --normalize"},
     {Msg::loudnessNoSound, Exit::input,  "{file} has no sound",                                 "there is nothing to measure",                                           "'tarsel info' shows what it holds"},
     {Msg::loudnessFailed,  Exit::input,  "can't measure {file}",                                "audio stream {text}: {system}",                                         "check the file"},
+    // comparing
+    {Msg::compareSizes,       Exit::usage,  "{file} and {file} can't be compared",   "their pictures are {text} and {text}",               "convert one with 'tarsel transcode --size'"},
+    {Msg::compareNothing,     Exit::usage,  "{file} and {file} can't be compared",   "no picture of one has a counterpart in the other",   "give another --offset"},
+    {Msg::compareFailed,      Exit::failed, "{file} can't be measured",              "{system}",                                           "--log FILE keeps the details"},
+    {Msg::comparePsnr,        Exit::check,  "{file} failed its check",               "the mean PSNR is {text} dB, below {text}",           "'tarsel compare' without --min-psnr shows the worst pictures"},
+    {Msg::compareLength,      Exit::check,  "{file} failed its check",               "{text} of its pictures have no counterpart",         "give another --offset, or compare without --min-psnr"},
+    {Msg::compareLengthNoted, Exit::done,   "{file}",                                "{text} of its pictures have no counterpart",         "they were left out"},
     // filters and modules
     {Msg::filterUnknown,     Exit::module, "--filter",                               "there is no filter {name}",                             "{hint}'tarsel modules' lists all"},
     {Msg::filterNoStream,    Exit::usage,  "--filter {text}",                        "this job has no {text}",                                "leave it out"},

@@ -153,6 +153,13 @@ enum class Msg : unsigned short {
     soundClipped,
     loudnessNoSound,
     loudnessFailed,
+    // comparing
+    compareSizes,
+    compareNothing,
+    compareFailed,
+    comparePsnr,
+    compareLength,
+    compareLengthNoted,
     // filters and modules
     filterUnknown,
     filterNoStream,
