@@ -200,7 +200,7 @@ TEST(Stages, ABandWritesItsOwnLinesOnly) {
     for (const auto& c : cases) {
         const auto plan = srk::makePlan(requestOf(c));
         const int step = plan->route.target->down(), lines = srk::fieldLines(c.th, plan->route.fields, 0);
-        const int first = lines / 3 / step * step, last = std::max(lines * 2 / 3 / step * step, first);
+        const int first = lines / 3, last = lines * 2 / 3;
         const Bytes whole = pictureOf(*plan, c);
         Bytes band = pictureOf(*plan, c, first, last);
         const srk::Picture target = layoutOf(codeOf(c.to), c.tw, c.th, band.data());
