@@ -8,6 +8,7 @@
 #include "builtin/kernels/convert/plan.h"
 #include "builtin/kernels/convert/workspace.h"
 #include "builtin/kernels/lines/lines.h"
+#include "builtin/kernels/lines/packedchroma.h"
 #include "builtin/kernels/lines/rgbchroma.h"
 #include "builtin/kernels/lines/rows16.h"
 #include "builtin/kernels/lines/rows8.h"
@@ -191,6 +192,9 @@ class Band {
             case Work::shuffle: return shuffle(stage, read(stage.reads[0], y), to);
             case Work::packFromYuv: return packFromYuv(stage, y, to);
             case Work::pixelLuma: return rgb4ToLuma(*plan_.rows.toYuv, read(stage.reads[0], y), to, count(n));
+            case Work::packedLuma:
+                return packedToLuma(read(stage.reads[0], y), to, count(n),
+                                    stage.format->packing == Packing::yuyv);
             default: {
                 Places places{};
                 places[count(stage.plane)] = to;
@@ -208,6 +212,7 @@ class Band {
                 return rgb4ToYuv(*plan_.rows.toYuv, read(stage.reads[0], y), to[0], to[1], to[2],
                                  count(stage.gives[0].width));
             case Work::pixelChroma: return pixelChroma(stage, y, to);
+            case Work::packedChroma: return packedChroma(stage, y, to);
             default: return;
         }
     }
@@ -390,14 +395,26 @@ class Band {
         kernel(*plan_.rows.toRgb, from[0], from[1], from[2], to, count(stage.pixels), stage.halves);
     }
 
-    void pixelChroma(const Stage& stage, int y, const Places& to) {
-        const Axis& axis = stage.down->axis;
-        const Byte* lines[maxTaps];
+    // Four lines of pixels, of which fewer taps repeat the last one; and their weights.
+    const Byte* fourLines(const Stage& stage, int y, const Byte** lines) {
+        const int taps = stage.down->axis.taps;
         window(stage, y, lines);
-        for (int t = axis.taps; t < 4; ++t) lines[t] = lines[axis.taps - 1];
-        const Byte* weights = stage.down->pixels.data() + (axis.taps > 1 ? 4 * count(y) : 0);
+        for (int t = taps; t < 4; ++t) lines[t] = lines[taps - 1];
+        return stage.down->pixels.data() + (taps > 1 ? 4 * count(y) : 0);
+    }
+
+    void pixelChroma(const Stage& stage, int y, const Places& to) {
+        const Byte* lines[maxTaps];
+        const Byte* const weights = fourLines(stage, y, lines);
         rgb4ToChroma(*plan_.rows.toYuv, lines, weights, stage.halves, to[1], to[2],
                      count(plan_.route.request.sourceWidth));
+    }
+
+    void packedChroma(const Stage& stage, int y, const Places& to) {
+        const Byte* lines[maxTaps];
+        const Byte* const weights = fourLines(stage, y, lines);
+        packedToChroma(lines, stage.down->axis.taps > 1 ? weights : nullptr, to[1], to[2],
+                       count(stage.gives[1].width), stage.format->packing == Packing::yuyv);
     }
 
     const Plan& plan_;

@@ -242,6 +242,54 @@ bool chromaBeforeMatrix(const Route& route, StageList& list) {
     return true;
 }
 
+// --- Packed 4:2:2 to chroma of fewer lines.
+
+// Weights of the pass down as packedToChroma takes them; empty: they do not fit.
+std::vector<Byte> packedWeights(const Axis& down) {
+    if (down.copies || down.taps == 1) return {0, 0, 0, 0};
+    if (down.taps != 4) return {};
+    std::vector<Byte> weights;
+    weights.reserve(down.weights.size());
+    for (const int weight : down.weights) {
+        if (weight < 0 || weight >= unity) return {};
+        weights.push_back(static_cast<Byte>(weight));
+    }
+    return weights;
+}
+
+// The stage that scales a plane of an unpacked picture down, and reads nothing else; -1: there is none.
+int onlyScaledDown(StageList& list, int unpack, int plane) {
+    Stage* reader = nullptr;
+    const Feed* feed = list.onlyReader(unpack, plane, &reader);
+    const bool fits = feed && feed->straight() && reader->work == Work::downSamples &&
+                      reader->gives[count(plane)].width == list.at(unpack).gives[count(plane)].width;
+    return fits ? static_cast<int>(reader - list.stages.data()) : -1;
+}
+
+// Chroma is taken out of the pixels where it is scaled down, not line by line.
+bool chromaFromPacked(const Route& route, StageList& list) {
+    if (route.deep) return false;
+    return forEach(list, Work::unpack, [&](int i) {
+        const Stage unpack = list.at(i);
+        if (unpack.format->packing != Packing::yuyv && unpack.format->packing != Packing::uyvy) return false;
+        const int u = onlyScaledDown(list, i, 1), v = onlyScaledDown(list, i, 2);
+        if (u < 0 || v < 0) return false;
+        auto down = std::make_shared<DownPass>(*list.at(u).down);
+        down->pixels = packedWeights(down->axis);
+        if (down->pixels.empty()) return false;
+        Stage chroma = unpack;
+        chroma.work = Work::packedChroma;
+        chroma.gives[0].width = 0;
+        chroma.down = std::move(down);
+        const int made = list.add(std::move(chroma));
+        list.redirect(u, 1, {made, 1});
+        list.redirect(v, 2, {made, 2});
+        list.at(i).work = Work::packedLuma;
+        list.at(i).gives[1].width = list.at(i).gives[2].width = 0;
+        return true;
+    });
+}
+
 // --- Two stages in one.
 
 bool matrixOfPixels(const Route& route, StageList& list) {
@@ -346,6 +394,7 @@ constexpr Rewrite rows[] = {
     {"copies dropped", copiesDropped},
     {"down first", downFirst, true},
     {"chroma before matrix", chromaBeforeMatrix, true, true},
+    {"chroma from packed", chromaFromPacked},
     {"matrix of pixels", matrixOfPixels},
     {"matrix into pixels", matrixIntoPixels},
     {"chroma repeated by matrix", chromaRepeatedByMatrix},

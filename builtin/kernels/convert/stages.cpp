@@ -10,11 +10,11 @@ namespace srk {
 
 namespace {
 
-constexpr const char* names[] = {"source",      "neutral",     "unpack",      "raise",      "change",
-                                 "across",      "down",        "downSamples", "twice",      "between",
-                                 "evens",       "lower",       "pack",        "copy",       "shuffle",
-                                 "unpackToYuv", "packFromYuv", "pixelLuma",   "pixelChroma"};
-static_assert(std::size(names) == static_cast<size_t>(Work::pixelChroma) + 1);
+constexpr const char* names[] = {
+    "source",      "neutral",     "unpack",      "raise",     "change",      "across",     "down",
+    "downSamples", "twice",       "between",     "evens",     "lower",       "pack",       "copy",
+    "shuffle",     "unpackToYuv", "packFromYuv", "pixelLuma", "pixelChroma", "packedLuma", "packedChroma"};
+static_assert(std::size(names) == static_cast<size_t>(Work::packedChroma) + 1);
 
 constexpr size_t cacheLine = 64;
 // Luma and chroma around one target line find their lines again.
@@ -95,7 +95,8 @@ size_t Stage::itemBytes() const {
 bool Stage::writesBytes() const { return itemBytes() == 1 || work == Work::lower; }
 
 bool Stage::readsWindow() const {
-    return work == Work::down || work == Work::downSamples || work == Work::pixelChroma;
+    return work == Work::down || work == Work::downSamples || work == Work::pixelChroma ||
+           work == Work::packedChroma;
 }
 
 int StageList::add(Stage stage) {

@@ -39,12 +39,14 @@ enum class Work : uint8_t {
     pack,         // planes to packed pixels
 
     // What only rewrites put in.
-    copy,         // bytes of a line
-    shuffle,      // pixels of three or four bytes to the other
-    unpackToYuv,  // pixels of four bytes to Y, U, V
-    packFromYuv,  // Y, U, V to pixels of three or four bytes
-    pixelLuma,    // pixels of four bytes to Y
-    pixelChroma,  // pixels of four bytes to U and V of every second pixel, filtered before the matrix
+    copy,          // bytes of a line
+    shuffle,       // pixels of three or four bytes to the other
+    unpackToYuv,   // pixels of four bytes to Y, U, V
+    packFromYuv,   // Y, U, V to pixels of three or four bytes
+    pixelLuma,     // pixels of four bytes to Y
+    pixelChroma,   // pixels of four bytes to U and V of every second pixel, filtered before the matrix
+    packedLuma,    // packed 4:2:2 to Y
+    packedChroma,  // packed 4:2:2 to U and V, scaled down
 };
 const char* nameOf(Work work);
 
@@ -79,7 +81,7 @@ struct AcrossPass {
 struct DownPass {
     Axis axis;
     std::vector<int8_t> bytes;  // downSamples of 8 bits: weights of each line
-    std::vector<Byte> pixels;   // pixelChroma: four for each line, or four for all
+    std::vector<Byte> pixels;   // pixelChroma and packedChroma: four for each line, or four for all
 };
 
 struct Stage {
