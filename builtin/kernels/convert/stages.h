@@ -1,9 +1,11 @@
-// A conversion as a list of stages. Each gives lines of up to four planes, and reads lines of other stages:
+// A conversion as a list of stages. Each gives lines of up to four planes, and reads lines of other stages.
+// As describe() prints the list of YUYV, 64 pixels wide, to I422 of half the height:
 //
 //     0 source
-//     1 unpack   reads 0.0                     gives Y 64, U 32, V 32
-//     2 across   reads 1.1                     ...
+//     1 unpack 0.0 -> 0: 64 in 16 x 128 bytes -> 1: 32 in 16 x 64 bytes -> 2: 32 in 16 x 64 bytes
+//     2 downSamples 1.0, 8 lines -> 0: 64 in target 0
 //
+// Stage 2 reads plane 0 of stage 1, eight lines for each of its own, and writes into plane 0 of the target.
 // The list of a conversion begins as the plain one that its formats and sizes ask for, and is then rewritten
 // to do less. It is pulled: the target's lines ask for those that they need.
 #pragma once
