@@ -70,7 +70,9 @@ int copyPacked(QvFrame& to, const QvFrame& from) {
     return QvStatus::ok;
 }
 
-int v210Bytes(int width, int height) { return 128 * ((width + 47) / 48) * height; }
+int v210Bytes(int width, int height) {
+    return static_cast<int>(qvDefaultStride(*qvPixelFormat(QvFourcc::v210), width)) * height;
+}
 
 long long frameBytesBound(int width, int height) { return 8LL * width * height + 128LL * height; }
 

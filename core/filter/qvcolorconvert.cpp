@@ -10,6 +10,7 @@
 #include "core/engine/status.h"
 #include "core/filter/qvfilter.h"
 #include "core/filter/srscaler.h"
+#include "core/measure/fourcc.h"
 #include "core/media/qvframe.h"
 #include "core/media/rows_p.h"
 
@@ -56,23 +57,7 @@ QvScalePicture pictureOf(const QvFrame& frame) {
             tt.strides[0],    tt.strides[1], tt.strides[2], {tt.planes[0], tt.planes[1], tt.planes[2]}};
 }
 
-uint32_t word(int a, int b, int c) {
-    return static_cast<uint32_t>(a) << 2 | static_cast<uint32_t>(b) << 12 | static_cast<uint32_t>(c) << 22;
-}
-
 constexpr int groupPixels = 6, groupBytes = 16;
-
-void packLine(const unsigned char* y, const unsigned char* u, const unsigned char* v, unsigned char* to,
-              int width) {
-    const int groups = width / groupPixels;
-    for (int g = 0; g < groups; ++g, y += 6, u += 3, v += 3, to += groupBytes) {
-        const uint32_t words[4] = {word(u[0], y[0], v[0]), word(y[1], u[1], y[2]), word(v[1], y[3], u[2]),
-                                   word(y[4], v[2], y[5])};
-        for (int i = 0; i < 4; ++i)
-            for (int k = 0; k < 4; ++k) to[4 * i + k] = static_cast<unsigned char>(words[i] >> 8 * k);
-    }
-    std::memset(to, 0, static_cast<size_t>(width - groups * groupPixels));
-}
 
 }  // namespace
 
@@ -155,11 +140,16 @@ void qvColorYUYVToI422(const QvFrame& in, QvFrame& out) {
 
 void qvColorYUYVToV210(const QvFrame& in, unsigned char* dest, QvFrame& scratch) {
     qvColorYUYVToI422(in, scratch);
-    const int width = scratch.width();
-    const std::ptrdiff_t lineBytes = (width + 47) / 48 * std::ptrdiff_t{128};
+    const auto lineBytes = static_cast<int>(qvDefaultStride(*qvPixelFormat(QvFourcc::v210), scratch.width()));
+    const int groups = scratch.width() / groupPixels, rest = scratch.width() - groups * groupPixels;
+    if (groups > 0) {
+        QvScalePicture whole = pictureOf(scratch);
+        whole.width = groups * groupPixels;
+        const int done = SRScaler(0, whole.tag, &whole, 0, 0, 0, QvFourcc::v210, dest, lineBytes, whole.width,
+                                  whole.height, 0, 0, nullptr);
+        QV_ASSERT_MSG(done == 1, "SRScaler() failed");
+    }
     for (int y = 0; y < scratch.height(); ++y)
-        packLine(scratch.plane(0) + static_cast<std::ptrdiff_t>(scratch.stride(0)) * y,
-                 scratch.plane(1) + static_cast<std::ptrdiff_t>(scratch.stride(1)) * y,
-                 scratch.plane(2) + static_cast<std::ptrdiff_t>(scratch.stride(2)) * y, dest + lineBytes * y,
-                 width);
+        std::memset(dest + static_cast<std::ptrdiff_t>(lineBytes) * y + groups * groupBytes, 0,
+                    static_cast<size_t>(rest));
 }

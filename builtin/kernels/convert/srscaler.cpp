@@ -156,10 +156,10 @@ struct BandRange {
 
 // Bands of one field follow each other; the last one takes what the others leave.
 BandRange bandRange(const Plan& plan, int bands, int band) {
-    const int fields = plan.fields, perField = bands / fields;
+    const int fields = plan.route.fields, perField = bands / fields;
     const int field = band % fields, index = band / fields;
-    const int lines = fieldLines(plan.request.height, fields, field);
-    const int step = plan.target->down();
+    const int lines = fieldLines(plan.route.request.height, fields, field);
+    const int step = plan.route.target->down();
     const int height = std::max((lines + 1) / perField / step * step, step);
     const int first = std::min(index * height, lines);
     return {field, first, index == perField - 1 ? lines : std::min(first + height, lines)};
@@ -171,8 +171,8 @@ int threadCount(unsigned mode) {
 
 int bandCount(int threads, const Plan& plan) {
     int bands = threads == 1 ? 1 : bandsPerThread * threads;
-    bands = std::clamp((plan.request.height + 4) / leastBandLines, 1, bands);
-    return plan.fields == 2 ? std::max(2, (bands + 1) / 2 * 2) : bands;
+    bands = std::clamp((plan.route.request.height + 4) / leastBandLines, 1, bands);
+    return plan.route.fields == 2 ? std::max(2, (bands + 1) / 2 * 2) : bands;
 }
 
 // Returns a workspace also when a band throws.

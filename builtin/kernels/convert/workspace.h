@@ -1,13 +1,10 @@
-// The lines that a band works on: rings of the latest ones, by their number.
+// The memory that a band works in.
 #pragma once
 
-#include <algorithm>
-#include <bit>
+#include <cstddef>
 #include <cstdint>
-#include <cstdlib>
 #include <memory>
 #include <new>
-#include <span>
 #include <vector>
 
 #include "builtin/kernels/convert/plan.h"
@@ -35,47 +32,16 @@ class Block {
     size_t count_ = 0;
 };
 
-// At least `slots` lines of `length` items. A line is found by its number until as many others have come. The
-// places are a power of two: a division for each of the lines that a target line takes would cost as much as
-// the work on them.
-template <class T>
-class Ring {
-  public:
-    void set(int slots, int length) {
-        slots_ = std::bit_ceil(static_cast<unsigned>(std::max(slots, 1)));
-        length_ = (static_cast<size_t>(length) + 63) & ~size_t{63};
-        block_.grow(slots_ * length_);
-        tags_.assign(slots_, -1);
-    }
-    void forget() { std::fill(tags_.begin(), tags_.end(), -1); }
-    // The place of line `y`; `fresh`: it must be filled.
-    T* at(int y, bool& fresh) {
-        const size_t slot = static_cast<size_t>(y) & (slots_ - 1);
-        fresh = tags_[slot] != y;
-        tags_[slot] = y;
-        return block_.get() + slot * length_;
-    }
-
-  private:
-    Block<T> block_;
-    std::vector<int> tags_;
-    size_t slots_ = 1;
-    size_t length_ = 0;
-};
-
-template <class S>
-struct Lines;  // pipeline.cpp
-
-// What a plan needs for one band at a time.
+// What a plan needs for one band of either field.
 class Workspace {
   public:
     explicit Workspace(const Plan& plan);
-    ~Workspace();
-    Workspace(const Workspace&) = delete;
-    Workspace& operator=(const Workspace&) = delete;
 
-    std::unique_ptr<Lines<Byte>> bytes;
-    std::unique_ptr<Lines<uint16_t>> words;
+    Block<Byte> lines;        // as the buffers of the stages say
+    std::vector<int> tags;    // which line of a stage lies at each place; -1: none
+    Block<Byte> padded;       // a line with its ends repeated
+    Block<float> paddedWide;  // the same for deep samples
+    Block<Byte> neutral;
 };
 
 }  // namespace srk

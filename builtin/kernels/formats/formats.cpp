@@ -138,8 +138,7 @@ long long lineBytes(const Format& format, int width, int plane) {
 }
 
 long long naturalStride(const Format& format, int width) {
-    const long long w = width;
-    if (format.packing == v210) return (w + 47) / 48 * 128;
+    if (format.packing == v210) return qvDefaultStride(*qvPixelFormat(QvFourcc::v210), width);
     const long long bytes = lineBytes(format, width, 0);
     return format.packing == bytes3 || std::strcmp(format.name, "GRAY") == 0 ? (bytes + 3) & ~3LL : bytes;
 }

@@ -317,7 +317,7 @@ void rgb4ToYuv(const ToYuv& rows, const Byte* from, Byte* y, Byte* u, Byte* v, s
         put(rowBytes(rv, blueRed, green), v + i);
     }
 #endif
-    for (; i < n; ++i) yuvOne(rows, from + 4 * i, y + i, u ? u + i : nullptr, v + i);
+    for (; i < n; ++i) yuvOne(rows, from + 4 * i, y + i, u ? u + i : nullptr, u ? v + i : nullptr);
 }
 
 void rgbToYuv(const ToYuv& rows, const Byte* b, const Byte* g, const Byte* r, Byte* y, Byte* u, Byte* v,

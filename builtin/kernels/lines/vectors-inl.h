@@ -163,8 +163,11 @@ class Packer {
   public:
     Packer() : order_(hn::SetTableIndices(hInts, places())) {}
     HWY_INLINE HV8 operator()(const HV32 v[4]) const {
-        const auto bytes =
-            clampBytes(hn::ReorderDemote2To(hWords, v[0], v[1]), hn::ReorderDemote2To(hWords, v[2], v[3]));
+        return ordered(
+            clampBytes(hn::ReorderDemote2To(hWords, v[0], v[1]), hn::ReorderDemote2To(hWords, v[2], v[3])));
+    }
+    // The last step alone.
+    HWY_INLINE HV8 ordered(HV8 bytes) const {
         return hn::BitCast(hBytes, hn::TableLookupLanes(hn::BitCast(hInts, bytes), order_));
     }
 

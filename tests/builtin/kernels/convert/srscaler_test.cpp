@@ -273,6 +273,38 @@ TEST(Scaling, ChromaFollowsLumaInEachFormatAndField) {
             }
 }
 
+// Against the geometry itself: a round trip would not notice fields that are exchanged.
+//
+//     lines of the top field     0 . 2 . 4 . 6      chroma a quarter of the way from 0 to 2, from 4 to 6
+//     lines of the bottom field  . 1 . 3 . 5 . 7    chroma three quarters of the way from 1 to 3, from 5 to 7
+TEST(Scaling, ChromaOfEachFieldLiesWhereItsLinesAsk) {
+    constexpr int w = 16, h = 48, slope = 4;
+    Bytes yuv(w * h * 4), planar(bytesOf("I420", w, h)), back(yuv.size());
+    for (int y = 0; y < h; ++y)
+        for (int x = 0; x < 4 * w; ++x)
+            yuv[static_cast<size_t>(y * w * 4 + x)] = static_cast<unsigned char>(20 + slope * y);
+    for (const unsigned kind : {QvScale::high, QvScale::standard}) {
+        convert("VUY4", yuv.data(), w, h, "I420", planar.data(), w, h, kind | QvScale::interlaced);
+        const auto chroma = [&](int line) -> unsigned char& {
+            return planar[static_cast<size_t>(w * h + line * w / 2)];
+        };
+        for (int line = 4; line < h / 2 - 4; ++line) {
+            const int field = line % 2;
+            const double at = field + 2 * (line / 2 * 2 + (field ? 0.75 : 0.25));
+            EXPECT_NEAR(chroma(line), 20 + slope * at, 1) << "line " << line << " kind " << kind;
+        }
+        // And the way back, from chroma that is laid where it belongs.
+        for (int line = 0; line < h / 2; ++line) {
+            const double at = line % 2 + 2 * (line / 2 * 2 + (line % 2 ? 0.75 : 0.25));
+            std::memset(&chroma(line), static_cast<int>(std::lround(20 + slope * at)), w / 2);
+        }
+        convert("I420", planar.data(), w, h, "VUY4", back.data(), w, h, kind | QvScale::interlaced);
+        for (int y = 8; y < h - 8; ++y)
+            EXPECT_NEAR(back[static_cast<size_t>(y * w * 4 + 1)], 20 + slope * y, 1)
+                << "line " << y << " kind " << kind;
+    }
+}
+
 TEST(Scaling, BandsOnSeveralThreadsAreOnePicture) {
     constexpr int w = 200, h = 150, tw = 132, th = 203;
     for (const char* name : {"I420", "BGR4", "v210"})

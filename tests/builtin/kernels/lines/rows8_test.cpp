@@ -4,6 +4,7 @@
 #include <array>
 #include <cmath>
 
+#include "builtin/kernels/lines/packedchroma.h"
 #include "builtin/kernels/lines/rgbchroma.h"
 #include "builtin/kernels/lines/yuvrgb.h"
 #include "tests/support/line_kernels.h"
@@ -17,6 +18,12 @@ constexpr Matrix b601 = Matrix::bt601, b709 = Matrix::bt709;
 auto chroma(std::array<Byte, 4> weights, bool filtered) {
     return [=](const LineCase& l) {
         rgb4ToChroma(toYuv(b601, false), l.in, weights.data(), filtered, l.out[0], l.out[1], l.n);
+    };
+}
+
+auto packedChroma(std::array<Byte, 4> weights, bool lumaFirst) {
+    return [=](const LineCase& l) {
+        packedToChroma(l.in, weights[0] ? weights.data() : nullptr, l.out[0], l.out[1], l.n, lumaFirst);
     };
 }
 
@@ -71,6 +78,15 @@ const LineKernel kernels[] = {
     {"chroma of a line", {four, four, four, four}, {half, half}, chroma({chromaUnity}, true)},
     {"chroma of single pixels", {four, four, four, four}, {half, half}, chroma({1, 5, 7, 3}, false)},
     {"chroma of a line's pixels", {four, four, four, four}, {half, half}, chroma({chromaUnity}, false)},
+    {"luma of YUYV", {twoBytes}, {one}, onLines(packedToLuma, true)},
+    {"luma of UYVY", {twoBytes}, {one}, onLines(packedToLuma, false)},
+    {"chroma of YUYV", {four}, {one, one}, packedChroma({}, true)},
+    {"chroma of UYVY", {four}, {one, one}, packedChroma({}, false)},
+    {"chroma of YUYV, four lines",
+     {four, four, four, four},
+     {one, one},
+     packedChroma({16, 48, 48, 16}, true)},
+    {"chroma of UYVY, four lines", {four, four, four, four}, {one, one}, packedChroma({127, 1, 0, 0}, false)},
 };
 
 }  // namespace

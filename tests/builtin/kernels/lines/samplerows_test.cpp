@@ -1,6 +1,7 @@
 // Every vector unit of the machine gives the samples of the plain formulas, and touches nothing else.
 #include "builtin/kernels/lines/samplerows.h"
 
+#include "builtin/kernels/lines/packedchroma.h"
 #include "builtin/kernels/lines/rgbchroma.h"
 #include "builtin/kernels/lines/rows16.h"
 #include "builtin/kernels/lines/rows8.h"
@@ -82,8 +83,8 @@ TEST(SampleRows, AllUnitsFollowTheFormulas) {
 TEST(Units, OfTheMachineReallyRun) {
     for (const auto target : machineTargets()) {
         const OnTarget only(target);
-        for (const auto unit :
-             {rows8Unit, rgbChromaUnit, yuvRgbUnit, rows16Unit, deepUnit, scale8Unit, sampleRowsUnit})
+        for (const auto unit : {rows8Unit, rgbChromaUnit, packedChromaUnit, yuvRgbUnit, rows16Unit, deepUnit,
+                                scale8Unit, sampleRowsUnit})
             EXPECT_STREQ(unit(), hwy::TargetName(target));
     }
 }

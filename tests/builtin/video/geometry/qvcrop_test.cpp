@@ -43,6 +43,27 @@ TEST(QvCrop, BoxesFollowTheModes) {
         {{{"mode", 1}, {"cropWidth", 640}, {"padTop", 4}, {"reset", 1}}, {0, 0, 1920, 1080}, 1920, 1080},
         {{{"mode", 4}, {"inputWidth", 1280}, {"inputHeight", 720}}, {160, 0, 1120, 720}, 960, 720},
         {{{"cropWidth", 640}, {"inputWidth", 320}}, {0, 0, 320, 360}, 320, 360},
+        // A smaller input cuts the box; one that does not reach it is taken whole.
+        {{{"mode", 1}, {"cropBox", QvRect(540, 60, 740, 260)}, {"inputWidth", 542}},
+         {540, 60, 542, 260},
+         2,
+         200},
+        {{{"mode", 1}, {"cropBox", QvRect(540, 60, 740, 260)}, {"inputWidth", 540}},
+         {0, 0, 540, 1080},
+         540,
+         1080},
+        {{{"mode", 1}, {"cropBox", QvRect(540, 60, 740, 260)}, {"inputWidth", 320}},
+         {0, 0, 320, 1080},
+         320,
+         1080},
+        {{{"mode", 1}, {"cropBox", QvRect(540, 60, 740, 260)}, {"inputHeight", 62}},
+         {540, 60, 740, 62},
+         200,
+         2},
+        {{{"mode", 1}, {"cropBox", QvRect(540, 60, 740, 260)}, {"inputHeight", 60}},
+         {0, 0, 1920, 60},
+         1920,
+         60},
     };
     for (const auto& row : rows) {
         const Cropper crop(row.params);

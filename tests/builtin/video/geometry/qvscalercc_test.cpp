@@ -1,6 +1,7 @@
 // The scaler as a filter, and the converter that applications use.
 #include "builtin/video/geometry/qvscalercc.h"
 
+#include <algorithm>
 #include <cstring>
 #include <vector>
 
@@ -181,5 +182,12 @@ TEST(QvColorConverter, PacksV210Lines) {
         std::memcpy(&word, dest.data() + lineBytes * 2, 4);
         EXPECT_EQ(word, pixel[1] * 4u | pixel[0] * 4u << 10 | pixel[3] * 4u << 20);
         EXPECT_EQ(dest.back(), 0xEE);
+        // After the last whole group as many zero bytes as pixels are left; the rest of the line stays.
+        const int rest = width % 6;
+        const unsigned char* end = dest.data() + lineBytes + width / 6 * 16;
+        EXPECT_EQ(std::count(end, end + rest, 0), rest);
+        if (width / 6 * 16 + rest < lineBytes) {
+            EXPECT_EQ(end[rest], 0xEE);
+        }
     }
 }
