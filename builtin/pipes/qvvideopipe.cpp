@@ -181,8 +181,8 @@ int QvVf::process(QvDecodePipe* decoder, int stream) {
 bool QvVf::validPosition(int position) const { return position >= 0 && position < nrFilters(); }
 
 int QvVf::addFilter(QvVideoFilter* filter, int position) {
-    const auto where = validPosition(position) ? filters_.begin() + position : filters_.end();
-    filters_.emplace(where, filter);
+    std::unique_ptr<QvVideoFilter> owned(filter);
+    filters_.insert(validPosition(position) ? filters_.begin() + position : filters_.end(), std::move(owned));
     return QvStatus::ok;
 }
 

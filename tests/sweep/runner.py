@@ -54,7 +54,7 @@ class Box:
 
     def start(self, arguments, variables=None, wrap=(), **streams):
         environment = {"PATH": os.environ["PATH"], "HOME": str(self.temporary), "TMPDIR": str(self.temporary),
-                       "ASAN_OPTIONS": "verify_asan_link_order=0:allocator_may_return_null=1:detect_leaks=1",
+                       "ASAN_OPTIONS": "verify_asan_link_order=0:allocator_may_return_null=1:detect_leaks=1:alloc_dealloc_mismatch=0",
                        **(variables or {})}
         self.command = [*map(str, wrap), self.sweep.tool, *map(str, arguments)]
         self.shown = " ".join([*(f"{k}={shlex.quote(str(v))}" for k, v in (variables or {}).items()),
