@@ -1,0 +1,218 @@
+// Segments of inputs, one after the other: which frames and samples come out, at each seam.
+#include <cmath>
+#include <random>
+
+#include "tests/system/tool.h"
+
+namespace {
+
+using testing::HasSubstr;
+using testing::Not;
+
+constexpr int kWidth = 32, kHeight = 32;
+constexpr std::size_t kFrameBytes = kWidth * kHeight * 3 / 2;
+const Words kRaw = {"--raw", "size=32x32,pixel=I420,rate=30000/1001"};
+constexpr double kRate = 30000.0 / 1001.0;
+constexpr long long kFrames = 200, kSamples = 300000;  // of the inputs
+
+// Frame n is filled with a level of its own, and sample n has a value of its own in both channels.
+class Join : public Tool {
+  protected:
+    void SetUp() override {
+        Tool::SetUp();
+        std::string pictures, sound;
+        for (int i = 0; i < kFrames; ++i) pictures += std::string(kFrameBytes, static_cast<char>(20 + i));
+        for (int i = 0; i < kSamples; ++i) sound += sample(i);
+        folder.write("p.yuv", pictures);
+        folder.write("s.wav", riff(wavChunk("fmt ", wavFormat(1, 2, 44100, 16)) + wavChunk("data", sound)));
+    }
+
+    static std::string sample(long long number) {
+        return leBytes(static_cast<std::uint64_t>(number & 0x7FFF), 2) +
+               leBytes(static_cast<std::uint64_t>(number >> 15), 2);
+    }
+
+    // The levels of the frames of a raw file; -1 for one that is not even.
+    std::vector<int> levels(const std::string& name) const {
+        const std::string bytes = contents(name);
+        EXPECT_EQ(bytes.size() % kFrameBytes, 0u);
+        std::vector<int> found;
+        for (std::size_t at = 0; at + kFrameBytes <= bytes.size(); at += kFrameBytes) {
+            const std::string frame = bytes.substr(at, kFrameBytes);
+            const bool even = frame.find_first_not_of(frame[0]) == frame.npos;
+            found.push_back(even ? static_cast<unsigned char>(frame[0]) : -1);
+        }
+        return found;
+    }
+    // The numbers of the samples of a WAV file; -1 for silence that follows others.
+    std::vector<long long> samples(const std::string& name) const {
+        const std::string data = contents(name).substr(80);
+        std::vector<long long> found;
+        for (std::size_t at = 0; at + 4 <= data.size(); at += 4)
+            found.push_back(static_cast<long long>(leNumber(data, at, 2)) +
+                            (static_cast<long long>(leNumber(data, at + 2, 2)) << 15));
+        return found;
+    }
+};
+
+// What comes out, by exact fractions. A frame n begins at n * 1001 / 30000 s.
+struct Model {
+    std::vector<int> levels;
+    std::vector<long long> samples;
+
+    void addFrames(long long first, long long last) {
+        for (long long i = first; i <= last; ++i) levels.push_back(static_cast<int>(20 + i));
+        // The sound of a segment begins with the sample that its first frame begins in, and goes on until all
+        // frames so far are covered.
+        const auto due = static_cast<long long>(levels.size()) * 1001 * 44100 / 30000;
+        const long long from = first * 1001 * 44100 / 30000;
+        for (long long i = 0; static_cast<long long>(samples.size()) < due; ++i) samples.push_back(from + i);
+    }
+};
+
+std::string frames(long long from, long long to) {
+    return std::to_string(from) + "f-" + std::to_string(to) + "f";
+}
+
+TEST_F(Join, EachSeamIsExact) {
+    std::mt19937 random(20260);
+    for (int round = 0; round < 12; ++round) {
+        Words job{"transcode"};
+        const bool cuts = round % 2 == 0;
+        job = job + (cuts ? Words{"p.yuv", "s.wav"} : Words{"--join"});
+        Model model;
+        const int segments = 1 + static_cast<int>(random() % 5);
+        for (int i = 0; i < segments; ++i) {
+            const long long from = random() % (kFrames - 1);
+            const long long to = from + 1 + random() % std::min(kFrames - from, 40LL);
+            job = job + (cuts ? Words{"--cut", frames(from, to)} : Words{"p.yuv+s.wav@" + frames(from, to)});
+            model.addFrames(from, to - 1);
+        }
+        const Words options = kRaw + Words{"-y", "--save-task", "job.xml", "-o", "o.yuv"};
+        works(job + options);
+        EXPECT_EQ(levels("o.yuv"), model.levels) << testing::PrintToString(job);
+        const auto heard = samples("o.wav");
+        ASSERT_EQ(heard.size(), model.samples.size()) << testing::PrintToString(job);
+        EXPECT_TRUE(heard == model.samples) << testing::PrintToString(job);
+        const std::string picture = contents("o.yuv"), sound = contents("o.wav");
+        works({"run", "job.xml", "-y"});
+        EXPECT_TRUE(contents("o.yuv") == picture && contents("o.wav") == sound) << "by the task";
+    }
+}
+
+TEST_F(Join, SoundAloneIsExactToTheSample) {
+    works({"transcode", "s.wav", "--cut", "0.5-1", "--cut", "2-2.25", "--cut", "0-0.1", "-o", "o.wav"});
+    std::vector<long long> wanted;
+    for (const auto& [from, to] : {std::pair{22050, 44100}, {88200, 99225}, {0, 4410}})
+        for (int i = from; i < to; ++i) wanted.push_back(i);
+    EXPECT_TRUE(samples("o.wav") == wanted);
+}
+
+TEST_F(Join, WhatASegmentLacksIsBlackOrSilent) {
+    works(Words{"transcode", "--join", "p.yuv@0f-3f", "s.wav@0-0.1", "p.yuv+s.wav@5f-7f", "-o", "o.yuv"} + kRaw);
+    // A tenth of a second is 2.997 frames, and none of the sound is lost.
+    EXPECT_EQ(levels("o.yuv"), (std::vector<int>{20, 21, 22, -1, -1, -1, 25, 26}));
+    const std::string black = contents("o.yuv").substr(3 * kFrameBytes, kFrameBytes);
+    EXPECT_EQ(black.substr(0, kWidth * kHeight), std::string(kWidth * kHeight, 16));
+    EXPECT_EQ(black.substr(kWidth * kHeight), std::string(kFrameBytes - kWidth * kHeight, '\x80'));
+    const auto heard = samples("o.wav");
+    const auto begin = static_cast<std::size_t>(3 * 1001 * 44100 / 30000);
+    ASSERT_GT(heard.size(), begin + 4410);
+    for (std::size_t i = 0; i < begin; ++i) EXPECT_EQ(heard[i], 0) << i;
+    EXPECT_EQ(heard[begin], 0);
+    EXPECT_EQ(heard[begin + 1], 1);
+    EXPECT_EQ(heard[begin + 4409], 4409);
+    EXPECT_EQ(heard[begin + 4410], 0);
+}
+
+TEST_F(Join, OthersAreConvertedToTheFirst) {
+    const std::string other = "testgen:size=64x48,rate=25,duration=2";
+    works(Words{"transcode", "--join", "p.yuv+s.wav@0f-10f", other + "@0.5-1.5", "-o", "o.yuv"} + kRaw);
+    // A second of the other is 29 frames at this rate.
+    EXPECT_EQ(levels("o.yuv").size(), 10u + 29u);
+    EXPECT_EQ(samples("o.wav").size(), 39u * 1001 * 44100 / 30000);
+    works({"transcode", "--join", other + "@0-1", "testgen:size=32x64,rate=50,duration=1", "-o", "b.avi"});
+    works({"transcode", "--join", other + "@0-1", "s.wav@0-1", "--samplerate", "8000", "--channels", "1", "-o",
+           "o2.wav"});
+    EXPECT_EQ(size("o2.wav"), 80 + 2 * 16000);
+}
+
+TEST_F(Join, FadesTextsAndTimecodesGoOverTheWholeOutput) {
+    folder.write("t.srt", "1\n00:00:00,400 --> 00:00:01,000\nHi\n");
+    const Words once{"transcode", "--raw", "size=32x32,pixel=I420,rate=25", "p.yuv", "--pixel", "I420"};
+    const Words joined{"transcode", "--raw",  "size=32x32,pixel=I420,rate=25", "--join", "p.yuv@0f-8f",
+                       "p.yuv@8f-21f", "p.yuv@21f-30f", "--pixel", "I420"};
+    for (const Words& options : {Words{"--fade", "4f"}, Words{"--subtitles", "t.srt"},
+                                 Words{"--timecode=10:00:00:00"}, Words{"--fade", "3f,5f", "--flip"}}) {
+        works(once + Words{"--to", "30f", "-o", "a.yuv", "-y"} + options);
+        works(joined + Words{"-o", "b.yuv", "-y"} + options);
+        EXPECT_TRUE(contents("a.yuv") == contents("b.yuv")) << testing::PrintToString(options);
+    }
+    works({"transcode", "s.wav", "--to", "3", "--fade", "0.5", "-o", "a.wav"});
+    works({"transcode", "--join", "s.wav@0-1", "s.wav@1-2", "s.wav@2-3", "--fade", "0.5", "-o", "b.wav"});
+    EXPECT_TRUE(contents("a.wav") == contents("b.wav"));
+}
+
+// Cuts keep what belongs to their input.
+TEST_F(Join, CutsKeepTheTimesOfTheirInput) {
+    folder.write("t.srt", "1\n00:00:00,400 --> 00:00:00,800\nHi\n");
+    const Words raw{"--raw", "size=32x32,pixel=I420,rate=25"};
+    for (const Words& options : {Words{"--subtitles", "t.srt"}, Words{"--timecode"}}) {
+        works(Words{"transcode", "p.yuv", "-o", "a.yuv", "-y"} + raw + options);
+        works(Words{"transcode", "p.yuv", "--cut", "5f-12f", "--cut", "18f-30f", "-o", "b.yuv", "-y"} + raw + options);
+        const std::string all = contents("a.yuv");
+        EXPECT_TRUE(contents("b.yuv") ==
+                    all.substr(5 * kFrameBytes, 7 * kFrameBytes) + all.substr(18 * kFrameBytes, 12 * kFrameBytes))
+            << options[0];
+    }
+}
+
+TEST_F(Join, NamesAreReadAsTheyExist) {
+    const std::string wav = contents("s.wav");
+    for (const char* name : {"a@1-2", "a+b.wav", "c.wav@3-4"}) folder.write(name, wav);
+    works({"transcode", "--join", "a+b.wav", "s.wav@0-1", "-o", "o.wav"});
+    EXPECT_EQ(size("o.wav"), 80 + 4 * (kSamples + 44100));
+    works({"transcode", "--join", "s.wav@1-", "s.wav@-1", "s.wav@-1--0.5", "-o", "p.wav"});
+    EXPECT_EQ(size("p.wav"), 80 + 4 * (kSamples - 44100 + 44100 + kSamples - 22050));
+}
+
+TEST_F(Join, WhatCantBeJoinedIsRefusedByName) {
+    const Words join{"transcode", "--join", "p.yuv@0f-10f", "p.yuv@20f-30f", "-o", "x.yuv"};
+    fails(2, join + kRaw + Words{"--filter", "rawdump:filename=d"}, {"--filter rawdump", "each segment"});
+    fails(2, join + kRaw + Words{"--from", "1"}, {"--from", "--join"});
+    fails(2, join + kRaw + Words{"--cut", "1-2"}, {"--join", "--cut"});
+    fails(2, join + kRaw + Words{"--volume", "3"}, {"--volume"});
+    fails(3, Words{"transcode", "--join", "p.yuv+no.wav@0f-1f", "-o", "x.yuv"} + kRaw, {"'no.wav'"});
+    fails(2, Words{"transcode", "--join", "p.yuv@9f-3f", "-o", "x.yuv"} + kRaw, {"3f"});
+    fails(2, Words{"transcode", "--join", "p.yuv@900f-", "-o", "x.yuv"} + kRaw, {"900f", "'p.yuv'"});
+    for (const char* cut : {"x", "1", "-", ""})
+        fails(2, {"transcode", "s.wav", "--cut", cut, "-o", "x.wav"}, {"--cut", "FROM-TO"});
+    fails(2, {"transcode", "s.wav", "--cut", "2-1", "-o", "x.wav"}, {"not after"});
+    fails(2, {"transcode", "--join", "-o", "x.wav"}, {"INPUT"});
+    fails(4, {"transcode", "--join", "s.wav@0-1", "s.wav@1-2", "-o", "s.wav", "-y"}, {"'s.wav'", "input"});
+}
+
+TEST_F(Join, ThePlanShowsTheSegments) {
+    const std::string plan =
+        works(Words{"transcode", "--join", "p.yuv@0f-10f", "s.wav@0-1", "-o", "x.yuv", "--dry-run"} + kRaw).out;
+    for (const char* part : {"segment  1\n", "video 0 of 'p.yuv', from 0:00:00.000", "segment  2\n", "'s.wav'",
+                             "expect  40 frames"})
+        EXPECT_THAT(plan, HasSubstr(part));
+}
+
+// A task of more inputs than a process may have open files.
+TEST_F(Join, ThousandsOfSegmentsNeedFewDescriptors) {
+    Words job{"-c", "ulimit -n 64; exec \"$@\"", "sh", program(), "transcode", "-o", "o.wav", "--join"};
+    const std::string wav =
+        riff(wavChunk("fmt ", wavFormat(1, 2, 44100, 16)) + wavChunk("data", patternBytes(400)));
+    for (int i = 0; i < 300; ++i) {
+        const std::string name = "w" + std::to_string(i) + ".wav";
+        folder.write(name, wav);
+        job.push_back(name);
+    }
+    const Outcome o = runProgram(Words{"sh"} + job, here());
+    EXPECT_EQ(o.status, 0) << o.err;
+    EXPECT_EQ(size("o.wav"), 80 + 300 * 400);
+}
+
+}  // namespace
