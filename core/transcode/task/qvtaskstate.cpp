@@ -267,10 +267,17 @@ int QvTaskState::getFilesForSegment(int index, AnyVector& files) const {
     return QvStatus::ok;
 }
 
-void QvTaskState::addFiles(const AnyVector& files) {
-    for (const Any& file : files)
-        if (file.isDict() && fileByFilename(file.asDict().get("filename")) < 0)
-            listIn(*this, "files").append(file);
+AnyVector QvTaskState::newFiles(const AnyVector& files) const {
+    AnyVector added;
+    std::vector<Any> names;
+    for (const Any& file : files) {
+        if (!file.isDict()) continue;
+        const Any& name = file.asDict().get("filename");
+        if (fileByFilename(name) >= 0 || std::find(names.begin(), names.end(), name) != names.end()) continue;
+        names.push_back(name);
+        added.append(file);
+    }
+    return added;
 }
 
 int QvTaskState::addSegment(const AnyVector& sources, const AnyVector& files, int position) {
@@ -291,12 +298,13 @@ int QvTaskState::addSegment(const AnyVector& sources, const AnyVector& files, in
         }
         QV_ASSERT(streams.at(i).isDict() && position >= -1 && position <= sourceCount(streams.at(i)));
     }
+    const AnyVector added = newFiles(files);
     _initEnabledState();
     for (int i = 0; i < streams.size(); ++i)
         insertAt(listIn(streams.at(i).asDict(), "sources"), sources.at(i), position);
     _checkSegmentCounts();
     insertAt(get("segments").asVector(), isEnabled() ? 1 : 0, position);
-    addFiles(files);
+    if (!added.empty()) listIn(*this, "files").extend(added);
     return QvStatus::ok;
 }
 
@@ -323,9 +331,10 @@ int QvTaskState::updateSegment(const AnyVector& sources, const AnyVector& files,
             "[TaskState] updateSegment: new segment has different src streams, but no file specs are given!");
         QV_FAIL_PLAIN();
     }
+    const AnyVector added = elsewhere ? newFiles(files) : AnyVector();
     for (int i = 0; i < streams.size(); ++i)
         streams.at(i).asDict().get("sources").asVector().set(position, sources.at(i));
-    if (elsewhere) addFiles(files);
+    if (!added.empty()) listIn(*this, "files").extend(added);
     return QvStatus::ok;
 }
 

@@ -140,5 +140,5 @@ class QV_API QvTaskState : public AnyDict {
     int countSegments() const;
     int _checkSegmentCounts();
     void _initEnabledState();
-    void addFiles(const AnyVector& files);
+    AnyVector newFiles(const AnyVector& files) const;  // those whose name the state does not have
 };

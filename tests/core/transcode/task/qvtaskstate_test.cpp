@@ -192,6 +192,19 @@ TEST(QvTaskState, MisuseChangesNothing) {
          {"a", "a"},
          [&](auto& s) { s.updateSegment(newSources("c"), {}, 0); },
          ""},
+        {"files without a name",
+         {"a", "a"},
+         [&](auto& s) {
+             s.get("files").asVector().append(AnyDict());
+             s.remove("#nsegs");
+             const QvTaskState before = s;
+             EXPECT_NE(failureOf([&] { s.addSegment(newSources("c"), files); }), "no failure");
+             s.remove("#nsegs");
+             EXPECT_EQ(s, before);
+             s.get("files").asVector().remove(1);
+             s.removeSegment(9);
+         },
+         ""},
         {"no such segment", {"a", "a"}, [&](auto& s) { s.removeSegment(1); }, ""},
         {"a negative one", {"a", "a"}, [&](auto& s) { s.removeSegment(-1); }, ""},
         {"a swap with none", {"a", "a"}, [&](auto& s) { s.swapSegments(0, 1); }, ""},
