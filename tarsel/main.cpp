@@ -96,6 +96,8 @@ int run(int argc, char** argv) {
     addInfo(line);
     addCaptions(line, signals);
     addFrame(line, signals, version);
+    addCompare(line, signals);
+    addScope(line, signals);
     addModules(line);
     addFormats(line);
     addPresets(line);

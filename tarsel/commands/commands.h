@@ -14,4 +14,6 @@ void addModules(CommandLine& line);
 void addFormats(CommandLine& line);
 void addPresets(CommandLine& line);
 void addRecover(CommandLine& line);
+void addCompare(CommandLine& line, Signals& signals);
+void addScope(CommandLine& line, Signals& signals);
 void addFrame(CommandLine& line, Signals& signals, const std::string& version);

@@ -5,19 +5,18 @@
 #include <cmath>
 #include <cstdio>
 #include <filesystem>
-#include <new>
 
 #include "tarsel/commands/commands.h"
 #include "tarsel/commands/outputoptions.h"
 #include "tarsel/commands/progressoption.h"
 #include "tarsel/host/events.h"
 #include "tarsel/host/files.h"
-#include "tarsel/host/memory.h"
 #include "tarsel/host/outputs/outputs.h"
 #include "tarsel/host/outputs/streamoutput.h"
 #include "tarsel/host/plugins.h"
 #include "tarsel/host/signals.h"
 #include "tarsel/host/terminal.h"
+#include "tarsel/picture/pictureconverter.h"
 #include "tarsel/picture/picturereader.h"
 #include "tarsel/source/source.h"
 #include "tarsel/words/commandline.h"
@@ -44,34 +43,6 @@ struct Given {
     std::shared_ptr<StreamOutput> stream;
     Signals* signals = nullptr;
     int warnings = 0;  // of the input
-};
-
-// Scales and converts pictures of one source to BGR3 of one size.
-class Shrinker {
-  public:
-    Shrinker(int width, int height) : scaler_(makeCodec<QvVideoFilter>("scaler", kVideoFilter)) {
-        setChecked(*scaler_, "outWidth", width, "--sheet");
-        setChecked(*scaler_, "outHeight", height, "--sheet");
-        setChecked(*scaler_, "FOURCC", static_cast<int>(QvFourcc::BGR3), "--sheet");
-        if (scaler_->open() != QvStatus::ok) fail();
-    }
-    ~Shrinker() { scaler_->close(); }
-
-    void convert(const QvFrame& from, QvFrame& to) {
-        QvFrame copy(from);
-        if (scaler_->write(copy) != QvStatus::ok || scaler_->ready() == 0) fail();
-        to = *scaler_->frame();
-        scaler_->next();
-    }
-
-  private:
-    [[noreturn]] void fail() const {
-        if (memory_.ranOut()) throw std::bad_alloc();
-        throw failure(Msg::sheetFailed, {scaler_->errorDesc()});
-    }
-
-    std::unique_ptr<QvVideoFilter> scaler_;
-    MemoryWatch memory_;
 };
 
 // What is shown while the input is read up to picture `last`.
@@ -157,15 +128,13 @@ void saveSheet(const Source& source, PictureReader& reader, const Given& given) 
     QvFrame sheet;
     sheet.init(QvFourcc::BGR3, grid.width * (width + kGap) + kGap, grid.height * (height + kGap) + kGap);
     sheet.setRGB(24, 24, 24);
-    Shrinker shrinker(width, height);
-    QvFrame cell;
+    PictureConverter shrinker(width, height, QvFourcc::BGR3, "--sheet");
     const int count = grid.width * grid.height;
     // The middle of each of `count` equal parts of the video.
     const auto middle = [&](int i) { return (2LL * i + 1) * reader.frames() / (2LL * count); };
     Reading reading(given, source, reader, middle(count - 1));
     for (int i = 0; i < count; ++i) {
-        shrinker.convert(reader.at(middle(i)), cell);
-        sheet.clip(cell, 0, 0, kGap + i % grid.width * (width + kGap),
+        sheet.clip(shrinker.convert(reader.at(middle(i))), 0, 0, kGap + i % grid.width * (width + kGap),
                    kGap + i / grid.width * (height + kGap), width, height);
     }
     reading.done();

@@ -124,6 +124,13 @@ constexpr Message kMessages[] = {
     {Msg::sheetFailed,            Exit::failed, "--sheet",                          "a picture can't be scaled: {system}",                          "give another sheet"},
     {Msg::pictureName,            Exit::usage,  "-o {file}",                        "a picture is a .png file",                                     "give a name that ends in .png"},
     {Msg::pictureFailed,          Exit::failed, "can't make the picture of {file}", "{system}",                                                     "choose another --at or --size; --log FILE keeps the details"},
+    // comparing
+    {Msg::compareSizes,       Exit::usage,  "{file} and {file} can't be compared",   "their pictures are {text} and {text}",               "convert one with 'tarsel transcode --size'"},
+    {Msg::compareNothing,     Exit::usage,  "{file} and {file} can't be compared",   "no picture of one has a counterpart in the other",   "give another --offset"},
+    {Msg::compareFailed,      Exit::failed, "{file} can't be measured",              "{system}",                                           "--log FILE keeps the details"},
+    {Msg::comparePsnr,        Exit::check,  "{file} failed its check",               "the mean PSNR is {text} dB, below {text}",           "'tarsel compare' without --min-psnr shows the worst pictures"},
+    {Msg::compareLength,      Exit::check,  "{file} failed its check",               "{text} of its pictures have no counterpart",         "give another --offset, or compare without --min-psnr"},
+    {Msg::compareLengthNoted, Exit::done,   "{file}",                                "{text} of its pictures have no counterpart",         "they were left out"},
     // filters and modules
     {Msg::filterUnknown,     Exit::module, "--filter",                               "there is no filter {name}",                             "{hint}'tarsel modules' lists all"},
     {Msg::filterNoStream,    Exit::usage,  "--filter {text}",                        "this job has no {text}",                                "leave it out"},

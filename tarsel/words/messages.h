@@ -8,7 +8,7 @@
 
 #include "tarsel/words/failure.h"
 
-enum class Msg : unsigned char {
+enum class Msg : unsigned short {
     // the command line
     commandMissing,
     commandUnknown,
@@ -124,6 +124,13 @@ enum class Msg : unsigned char {
     sheetFailed,
     pictureName,
     pictureFailed,
+    // comparing
+    compareSizes,
+    compareNothing,
+    compareFailed,
+    comparePsnr,
+    compareLength,
+    compareLengthNoted,
     // filters and modules
     filterUnknown,
     filterNoStream,
