@@ -54,7 +54,8 @@ void Job::begin(JobPlan plan) {
 
 // Next to a raw file there may be others, such as its sound.
 std::unique_ptr<Source> Job::openInput(const std::string& name) {
-    const bool isRaw = options_.inputs.size() == 1 || !Source::describesItself(name);
+    const bool onlyOne = options_.inputs.size() == 1 && !options_.join;
+    const bool isRaw = onlyOne || !Source::describesItself(name);
     rawTaken_ |= isRaw;
     auto source = std::make_unique<Source>(name, isRaw ? options_.raw : "");
     source->selectAll();
