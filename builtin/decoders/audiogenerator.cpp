@@ -43,9 +43,10 @@ int AudioGenerator::takeFormat(const AnyDict& dict, QvPcmFormat& format) {
     format.samplerate = dict.getInt32("samplerate", format.samplerate);
     format.channels = dict.getInt32("channels", format.channels);
     format.bitsPerSample = dict.getInt32("bitsPerSample", format.bitsPerSample);
-    const bool known = format.samplerate >= 1 && format.samplerate <= mostRate && format.channels >= 1 &&
-                       format.channels <= mostChannels &&
-                       (format.bitsPerSample == 16 || format.bitsPerSample == 24 || format.bitsPerSample == 32);
+    const bool known =
+        format.samplerate >= 1 && format.samplerate <= mostRate && format.channels >= 1 &&
+        format.channels <= mostChannels &&
+        (format.bitsPerSample == 16 || format.bitsPerSample == 24 || format.bitsPerSample == 32);
     return known ? QvStatus::ok : QvStatus::invalidStructure;
 }
 

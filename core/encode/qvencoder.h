@@ -41,8 +41,8 @@ class QV_API QvEncoder : public QvCodec {
 // (QvFramerate), "width", "height", "inFOURCC" (vector of the input formats it takes) or
 // "selectedFOURCC", "bitrate" (QvBitrate), "nrViews", "extension", "vBitrate", "maxVBitrate",
 // "srPossible", "_needTopBlanking", "_isAVCHD", and optionally "dstBuffSize", the bytes that its output
-// must be able to hold; "takesUserData" is true for one that writes the user data of frames, which sources read
-// only if somebody wants them.
+// must be able to hold; "takesUserData" is true for one that writes the user data of frames, which sources
+// read only if somebody wants them.
 class QV_API QvVideoEncoder : public QvEncoder {
   public:
     explicit QvVideoEncoder(const QvModule* module = nullptr) : QvEncoder(module) {}

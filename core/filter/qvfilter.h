@@ -9,8 +9,8 @@
 //   "_front"     int   0   1: before the automatic converters, 0: after them
 //   "info"       dict      read only: what store writes, without the three above
 //
-// A video filter that looks at the user data of frames answers 1 for "takesUserData": sources read them only if
-// a filter or the encoder wants them.
+// A video filter that looks at the user data of frames answers 1 for "takesUserData": sources read them only
+// if a filter or the encoder wants them.
 #pragma once
 
 #include "core/arch/api.h"

@@ -1,5 +1,5 @@
-// Fits encoders to an input: each property that is asked for is set to what the encoder, or its preset, can do
-// nearest to the input's.
+// Fits encoders to an input: each property that is asked for is set to what the encoder, or its preset, can
+// do nearest to the input's.
 //
 //     QvFormatMatcher matcher(QvFormatMatcher::dimensions | QvFormatMatcher::framerate, 0, &preset);
 //     matcher.matchFile(decoder, pipe);

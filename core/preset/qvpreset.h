@@ -4,7 +4,8 @@
 //
 // Keys: "profile", "name", "custom" (0 built-in, 1 a user's), optional "shortName", "info", "disabled";
 // built-in: "videoCodecs", "audioCodecs", "muxers" (module names, the first is the default); a user's:
-// "muxer", "streams", "programs", "extension"; optional "PresetMeta", see QvPresetMeta. Keys that begin with "#" are marks of the running program.
+// "muxer", "streams", "programs", "extension"; optional "PresetMeta", see QvPresetMeta. Keys that begin with
+// "#" are marks of the running program.
 #pragma once
 
 #include <optional>

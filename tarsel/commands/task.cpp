@@ -41,7 +41,7 @@ class Relink {
   public:
     // `rule`: OLD=NEW.
     Relink(const std::string& rule, const StoredTask& task)
-        : folder_(fs::absolute(task.name()).parent_path()) {
+        : folder_(fs::path(absoluteName(task.name())).parent_path()) {
         const size_t equals = rule.find('=');
         if (equals == std::string::npos || equals == 0 || equals + 1 == rule.size())
             throw failure(Msg::taskRelinkWrong, {"relink", rule});
@@ -68,7 +68,7 @@ class Relink {
   private:
     // Without "." and "..", and without a separator at the end.
     static fs::path absolute(const fs::path& name) {
-        const fs::path whole = fs::absolute(name).lexically_normal();
+        const fs::path whole = absoluteName(name.string());
         return whole.has_filename() ? whole : whole.parent_path();
     }
 

@@ -105,6 +105,8 @@ std::string whyNoFolder(const std::string& name) {
     return error ? inLine(error.message()) : "";
 }
 
+std::string absoluteName(const std::string& name) { return fs::absolute(name).lexically_normal().string(); }
+
 bool exists(const std::string& name) {
     std::error_code error;
     return fs::exists(name, error);

@@ -33,6 +33,8 @@ void requireNoFolder(const std::string& name, const std::string& extension);
 // Why `name` is no folder whose entries can be read, in the same words; "" if it is one.
 std::string whyNoFolder(const std::string& name);
 
+// The name from the root on, without "." and "..".
+std::string absoluteName(const std::string& name);
 bool exists(const std::string& name);
 bool isRegularFile(const std::string& name);
 // Neither a regular file nor a folder, as "/dev/null" is.

@@ -40,7 +40,7 @@ class Job {
     JobParts parts_;
     InputLengths lengths_;
     bool rawTaken_ = false;  // --raw describes an input
-    bool joined_ = false;  // the last source
+    bool joined_ = false;    // the last source
     Warnings warnings_;
 };
 

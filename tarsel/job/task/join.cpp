@@ -32,7 +32,8 @@ MediaTime lengthOf(const JobPlan& plan) {
     return shortest;
 }
 
-// A part begins and ends with a frame of its picture, as it does in a job of one part; its sound goes with it.
+// A part begins and ends with a frame of its picture, as it does in a job of one part; its sound goes with
+// it.
 void alignToFrames(const JobPlan& plan, StreamPart& part) {
     const PlannedStream* const video = findStream(plan, qvVideoStream, 0);
     if (!video || part.whole) return;

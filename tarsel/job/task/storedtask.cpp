@@ -57,14 +57,13 @@ std::string writeTask(const AnyDict& state, const std::string& file) {
 }
 
 void makeAbsolute(AnyDict& state) {
-    const fs::path here = fs::current_path();
-    changeTaskFiles(state, [&](const std::string& name, TaskFileUse) { return fromFolder(name, here); });
+    changeTaskFiles(state, [](const std::string& name, TaskFileUse) { return absoluteName(name); });
 }
 
 void makeRelative(AnyDict& state, const std::string& folder) {
-    const fs::path here = fs::current_path(), base = (here / folder).lexically_normal();
+    const fs::path base = absoluteName(folder.empty() ? "." : folder);
     changeTaskFiles(state, [&](const std::string& name, TaskFileUse) {
-        return fs::path(fromFolder(name, here)).lexically_relative(base).string();
+        return fs::path(absoluteName(name)).lexically_relative(base).string();
     });
 }
 
@@ -73,7 +72,7 @@ StoredTask::StoredTask(const std::string& file) : name_(file) {
     Any root, version;
     if (XmlParser::restoreDict(Any(file.c_str()), raw_, root, version) != QvStatus::ok)
         throw failure(Msg::taskRefused, {file, "it can't be read"});
-    const fs::path folder = fs::absolute(file).parent_path();
+    const fs::path folder = fs::path(absoluteName(file)).parent_path();
     AnyDict state = raw_;
     changeTaskFiles(state, [&](const std::string& name, TaskFileUse) { return fromFolder(name, folder); });
     state_ = QvTaskState(state);
