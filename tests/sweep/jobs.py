@@ -4,6 +4,7 @@ A job overwrites what an earlier run of it wrote. The earlier run has other argu
 differs from the new one of that name, and where the output is a set of files it has written more of them.
 """
 import dataclasses
+import pathlib
 import struct
 import zlib
 
@@ -39,12 +40,17 @@ JOBS = [
         ["frame", *CLIP, "--sheet", "16x1", "-o", "sheet.png", "-y"]),
     Job("effects", ["transcode", *CLIP, *EFFECTS, "-o", "burnt.yuv", "-y"],
         ["transcode", *CLIP, "-o", "burnt.yuv", "-y"]),
-    Job("task", ["transcode", "in.wav", "-o", "out.wav", "--save-task", "task.xml", "-y"],
-        ["transcode", "in3.wav", "-o", "out.wav", "--save-task", "task.xml", "-y"]),
+    Job("task", ["transcode", "in.wav", "-o", "out.wav", "--save-task", "task.xml", "--relative", "-y"],
+        ["transcode", "in3.wav", "-o", "out.wav", "--save-task", "task.xml", "--relative", "-y"]),
     Job("dump", card("--pixel", "I420", "--filter", "rawdump:filename=dump", "-o", "dumped.yuv"),
         card("--pixel", "I420", "--filter", "rawdump:filename=dump", "-o", "dumped.yuv", length=0.28)),
-    Job("logo", card("--logo", "shown#9.png@4,4", "--save-task", "shown.xml", "-o", "shown.png"),
-        card("--logo", "shown#9.png@0,0", "--save-task", "shown.xml", "-o", "shown.png", length=0.28, size="48x64")),
+    Job("logo", card("--logo", "shown#9.png@4,4", "--save-task", "shown.xml", "--relative", "-o", "shown.png"),
+        card("--logo", "shown#9.png@0,0", "--save-task", "shown.xml", "--relative", "-o", "shown.png", length=0.28, size="48x64")),
+    Job("join", ["transcode", "--join", "clip.yuv@0-0.2", "in.wav", "clip.yuv+in.wav@0.2-0.4", *RAW, "--fade", "2f",
+                 "--subtitles", "talk.srt", "--save-task", "joined.xml", "--relative", "-o", "joined.yuv", "-y"],
+        ["transcode", *CLIP, "--cut", "0-0.2", "--cut", "0.4-0.5", "--save-task", "joined.xml", "--relative",
+         "-o", "joined.yuv", "-y"]),
+    Job("run", ["run", "stored.xml", "-y"], ["run", "stored.xml", "-y"]),
     Job("captions", ["captions", "one.scc", "--json"], stdout=True),
     Job("info", ["info", "in.wav", "talk.srt", "--json"], stdout=True),
 ]
@@ -78,4 +84,5 @@ SCC = (b"Scenarist_SCC V1.0\n\n"
 def inputs():
     return {"in.wav": wav(pattern(12000)), "in3.wav": wav(pattern(9000, 11), channels=3),
             "clip.yuv": pattern(64 * 48 * 3 // 2 * 20), "mark.png": png(20, 10),
-            "shown#9.png": png(12, 12), "talk.srt": SRT, "one.scc": SCC}
+            "shown#9.png": png(12, 12), "talk.srt": SRT, "one.scc": SCC,
+            "stored.xml": (pathlib.Path(__file__).parent / "stored.xml").read_bytes()}

@@ -111,5 +111,6 @@ JobPlan planTask(const StoredTask& task, const OutputForm& output, std::vector<J
     if (plan.streams.empty()) throw failure(Msg::taskRefused, {task.name(), "nothing feeds its output"});
     planFrames(plan);
     planSamples(plan);
+    if (task.isJoin()) plan.notes.clear();  // silence may be anywhere
     return plan;
 }
