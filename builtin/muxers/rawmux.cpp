@@ -236,11 +236,12 @@ int RawMux::openStream(int type, int nr, const char* failure) {
     auto& output = *stream(type, nr);
     const auto name = outputName(type, nr);
     output.setParam("outfilename", name);
-    if (output.init() == 0) return QvStatus::ok;
+    const int opened = output.init();
+    if (opened == QvStatus::ok) return opened;
     outputs_.back()->failed = true;
     const std::string message = failure;
-    return setError(QvStatus::failed, "%s%s", message.substr(0, message.size() - 2).c_str(),
-                    qv_os_name(name).c_str());
+    return setError(opened == QvStatus::outOfMemory ? opened : QvStatus::failed, "%s%s",
+                    message.substr(0, message.size() - 2).c_str(), qv_os_name(name).c_str());
 }
 
 int RawMux::close() { return getState() == qvStateOpen ? finish(0) : QvStatus::ok; }

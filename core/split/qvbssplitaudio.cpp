@@ -115,12 +115,12 @@ int QvBsSplitAudio::init(const AnyDict& newParams) {
     Undo ending([this] { destroy(1); });
     wav_ = std::make_unique<Wav>();
     if (const int status = QvBufStreamFifoCb::init(newParams)) return status;
-    if (!openFiles()) return QvStatus::failed;
+    if (const int status = openFiles()) return status;
     ending.dismiss();
     return QvStatus::ok;
 }
 
-bool QvBsSplitAudio::openFiles() {
+int QvBsSplitAudio::openFiles() {
     Wav& wav = *wav_;
     const Any& mask = params().get("channelMask");
     const WavFormat format = {params().getInt32("samplerate", 0), params().getInt32("channels", 0),
@@ -133,23 +133,26 @@ bool QvBsSplitAudio::openFiles() {
     if (!legal || ring->chunksize(ring) < static_cast<unsigned>(format.sampleBytes())) {
         qv_log()->error("[split writer] Can not write WAV with %d Hz, %d channels, %d bits.",
                         format.samplerate, format.channels, format.bitsPerSample);
-        return false;
+        return QvStatus::failed;
     }
     if (!takeChunks()) {
         qv_log()->error("[split writer] Can not write chunks that are not \"id\" and \"data\".");
-        return false;
+        return QvStatus::failed;
     }
     const Any name = params().get("outfilename");
-    if (!wav.split) return openFile(name);
-    if (!name.isText()) return openFile(Any(""));
-    if (wav.work.init(format.samplerate, format.channels, format.valueBytes(), format.samplerate))
-        return false;
+    const auto opened = [this](const Any& file) { return openFile(file) ? QvStatus::ok : QvStatus::failed; };
+    if (!wav.split) return opened(name);
+    if (!name.isText()) return opened(Any(""));
+    if (const int status =
+            wav.work.init(format.samplerate, format.channels, format.valueBytes(), format.samplerate))
+        return status;
     for (int channel = 0; channel < format.channels; ++channel) {
-        if (!openFile(_channelFileName(name, channel))) return false;
-        if (wav.files.back()->samples.init(format.samplerate, 1, format.valueBytes(), format.samplerate))
-            return false;
+        if (const int status = opened(_channelFileName(name, channel))) return status;
+        QvPcm& samples = wav.files.back()->samples;
+        if (const int status = samples.init(format.samplerate, 1, format.valueBytes(), format.samplerate))
+            return status;
     }
-    return true;
+    return QvStatus::ok;
 }
 
 Any QvBsSplitAudio::_channelFileName(const Any& name, int channel) {

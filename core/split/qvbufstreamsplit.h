@@ -103,7 +103,7 @@ class QV_API QvBsSplitAudio : public QvBufStreamFifoCb {
     struct Wav;
 
     int initPlain(const AnyDict& params);
-    bool openFiles();
+    int openFiles();
     bool openFile(const Any& name);
     bool takeChunks();
     std::array<unsigned char, 80> streamHeader();

@@ -50,7 +50,7 @@ JOBS = [
                  "--subtitles", "talk.srt", "--save-task", "joined.xml", "--relative", "-o", "joined.yuv", "-y"],
         ["transcode", *CLIP, "--cut", "0-0.2", "--cut", "0.4-0.5", "--save-task", "joined.xml", "--relative",
          "-o", "joined.yuv", "-y"]),
-    Job("run", ["run", "stored.xml", "-y"], ["run", "stored.xml", "-y"]),
+    Job("run", ["run", "stored.xml", "-y"], ["transcode", *CLIP, "in3.wav", "-o", "out2.yuv", "-y"]),
     Job("captions", ["captions", "one.scc", "--json"], stdout=True),
     Job("info", ["info", "in.wav", "talk.srt", "--json"], stdout=True),
 ]

@@ -174,10 +174,14 @@ JobPlan planJob(const PlanOptions& options, const OutputForm& output, std::vecto
     EffectOptions effects = options.effects;
     effects.pixel = output.pixel;
     FilterPlanner filters(plan, effects, known ? known->pictures : std::vector<PictureFormat>());
-    if (!known) checkOutput(plan, options);
+    if (!known) checkKinds(plan, options);
     if (plan.streams.empty()) throw failure(Msg::segmentNoStreams, {plan.inputs.front().name});
     SoundPlanner sounds(plan, options);
-    if (!known) warnOfUnused(plan, options);
+    if (!known) {
+        checkCounts(plan);
+        checkChannels(plan, options);
+        warnOfUnused(plan, options);
+    }
     planPoints(plan, {options.from, options.to, options.duration});
     sounds.planDelays();
     planEnds(plan, options.shortest, options.longest);

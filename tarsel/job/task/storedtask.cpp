@@ -7,6 +7,7 @@
 #include <new>
 
 #include "tarsel/host/files.h"
+#include "tarsel/host/memory.h"
 #include "tarsel/job/task/taskfiles.h"
 #include "tarsel/words/messages.h"
 
@@ -111,6 +112,7 @@ bool StoredTask::isJoin() const { return state_.nrSegments() != 1 || !state_.isS
 
 void StoredTask::open() {
     for (const std::string& name : inputs()) requireInput(name);
+    const MemoryWatch memory;
     OpenReport report;
     QvEncodePipe* pipe = nullptr;
     Any error;
@@ -120,12 +122,11 @@ void StoredTask::open() {
             task_.reset(QvBatchTask::fromState(state_, decoders_, &pipe, options, &report, &error));
         else
             task_.reset(QvTask::fromState(state_, decoders_, &pipe, 0, &report, &error));
-    } catch (const QvMemoryFailure&) {
-        throw;
-    } catch (const QvException& broken) {
-        if (report.file.empty()) throw failure(Msg::taskRefused, {name_, broken.what()});
+    } catch (const QvException&) {
+        error = "an input lacks what it takes from it";
     }
     pipe_.reset(pipe);
+    if (!task_ && memory.ranOut()) throw std::bad_alloc();
     if (!report.file.empty()) throw failure(Msg::inputRefused, {report.file, report.reason});
     if (!task_) throw failure(Msg::taskRefused, {name_, error.toString().asString("it can't be restored")});
     task_->setPostprocessCommand(Any());  // a run of the engine would run it
