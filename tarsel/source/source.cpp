@@ -147,7 +147,7 @@ Source::Source(QvDecodePipe& decoder) : open_(&decoder) {
 }
 
 Source::Source(const std::string& name, std::unique_ptr<QvDecodePipe> decoder)
-    : name_(name), isFile_(false), decoder_(std::move(decoder)) {}
+    : name_(name), isFile_(false), decoder_(std::move(decoder)), open_(decoder_.get()) {}
 
 bool Source::describesItself(const std::string& spec) {
     if (isGenerator(spec)) return true;

@@ -88,6 +88,11 @@ void checkCounts(const JobPlan& plan) {
     }
 }
 
+void checkFit(const JobPlan& plan, const PlanOptions& options) {
+    checkCounts(plan);
+    checkChannels(plan, options);
+}
+
 // As captions, of which raw pictures hold none.
 void warnOfUnused(JobPlan& plan, const PlanOptions& options) {
     const auto isLeft = [&](const JobInput& input, int type) {
@@ -160,8 +165,7 @@ void checkDamage(JobPlan& plan, bool acceptPartial) {
 
 void checkOutput(JobPlan& plan, const PlanOptions& options) {
     checkKinds(plan, options);
-    checkCounts(plan);
-    checkChannels(plan, options);
+    checkFit(plan, options);
 }
 
 JobPlan planJob(const PlanOptions& options, const OutputForm& output, std::vector<JobInput> inputs,
@@ -174,9 +178,10 @@ JobPlan planJob(const PlanOptions& options, const OutputForm& output, std::vecto
     EffectOptions effects = options.effects;
     effects.pixel = output.pixel;
     FilterPlanner filters(plan, effects, known ? known->pictures : std::vector<PictureFormat>());
-    if (!known) checkOutput(plan, options);
+    if (!known) checkKinds(plan, options);
     if (plan.streams.empty()) throw failure(Msg::segmentNoStreams, {plan.inputs.front().name});
-    SoundPlanner sounds(plan, options);
+    SoundPlanner sounds(plan, options);  // its map decides which sounds there are
+    if (!known) checkFit(plan, options);
     if (!known) warnOfUnused(plan, options);
     planPoints(plan, {options.from, options.to, options.duration});
     sounds.planDelays();
