@@ -25,7 +25,9 @@ class Shown {
         : progress_({}, false, inQuotes(source.name()) + " ", false),
           samples_(static_cast<double>(source.decoder().nrSamples(stream))),
           rate_(source.decoder().getAudioParam(stream, "samplerate").asInt32(1)) {
-        if (progress_.onTerminal()) progress_.start();
+        if (!progress_.onTerminal()) return;
+        progress_.start();
+        progress_.show(at(0));
     }
     ~Shown() {
         if (progress_.onTerminal()) progress_.finish({});
@@ -33,16 +35,19 @@ class Shown {
     Shown(const Shown&) = delete;
     Shown& operator=(const Shown&) = delete;
     void update(long long measured) {
-        if (!progress_.onTerminal() || !progress_.due()) return;
+        if (progress_.onTerminal() && progress_.due()) progress_.update(at(measured));
+    }
+
+  private:
+    ProgressState at(long long measured) const {
         ProgressState state;
         const auto done = static_cast<double>(measured);
         if (samples_ > 0) state.part = std::min(done / samples_, 1.0);
         state.outSeconds = done / rate_;
         state.frame = -1;
-        progress_.update(state);
+        return state;
     }
 
-  private:
     Progress progress_;
     double samples_;
     int rate_;
