@@ -119,20 +119,21 @@ int WavStream::readPlain(int count) {
     return static_cast<int>(got / channels);
 }
 
-// In pieces that stay in the cache. A piece lies on one side of what has been counted.
+// In pieces that stay in the cache. A piece lies on one side of where counting begins and ends.
 int WavStream::readConverted(int count) {
     const auto frameBytes = static_cast<std::size_t>(header_.frameBytes());
     const auto channels = static_cast<std::size_t>(header_.channels);
     const long long before = clipped_;
     int done = 0;
     while (done < count) {
-        const long long position = pcm->position() + done, left = counted_ - position;
+        const long long position = pcm->position() + done;
         auto piece = std::min<long long>(count - done, static_cast<long long>(stored_.size() / frameBytes));
-        if (left > 0) piece = std::min(piece, left);
+        for (const long long bound : {counted_, countEnd_})
+            if (bound > position) piece = std::min(piece, bound - position);
         const std::size_t got = file_.read(stored_.data(), frameBytes, static_cast<std::size_t>(piece));
         if (header_.bigEndian) wav::swapBytes(stored_.data(), header_.valueBytes(), got * channels);
         const std::size_t clipped = got > 0 ? convert_(pcm->ptr(done), stored_.data(), got * channels) : 0;
-        if (left <= 0) {
+        if (position >= counted_ && position < countEnd_) {
             clipped_ += static_cast<long long>(clipped);
             counted_ = position + static_cast<long long>(got);
         }
@@ -141,6 +142,12 @@ int WavStream::readConverted(int count) {
     }
     if (clipped_ != before) params.set("clippedSamples", Any(clipped_));
     return done;
+}
+
+void WavStream::countClippedWithin(long long from, long long to) {
+    clipped_ = 0;
+    counted_ = from;
+    countEnd_ = to;
 }
 
 int WavStream::seek(long long sample) {
@@ -162,8 +169,18 @@ int WavDec::setAll(const Any& value) {
     return result;
 }
 
+int WavDec::setClipRange(const Any& value) {
+    if (!value.isVector() || value.asVector().size() != 2) return QvStatus::invalidParam;
+    const Any &from = value.asVector().at(0), &to = value.asVector().at(1);
+    if (!from.isInt() || !to.isInt()) return QvStatus::invalidParam;
+    for (const auto& stream : streams())
+        static_cast<WavStream&>(*stream).countClippedWithin(from.toInt64(), to.toInt64());
+    return QvStatus::ok;
+}
+
 int WavDec::setParam(const char* name, const Any& value) {
     if (std::strcmp(name, "openParameters") == 0 || std::strcmp(name, "settings") == 0) return setAll(value);
+    if (std::strcmp(name, "clipRange") == 0) return setClipRange(value);
     if (auto result = _setRow<Settings>(rows, settings_, name, value)) return *result;
     return BaseDecodePipe::setParam(name, value);
 }

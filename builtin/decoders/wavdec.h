@@ -16,9 +16,11 @@
 // The stream then has "sourceFormat" (String, for people) where the file has other values than those
 // delivered; "channelMask" (Int64) where it names the places of its channels; and, after the first of them
 // was read, "clippedSamples" (Int64), the values that were clipped. A part that is read again is not counted
-// again. Closing the stream logs their number as a warning.
+// again, nor what lies outside of "clipRange" (a Vector of two Int64 of an open file: a sample, and the one
+// after the last; all of them at first). Closing the stream logs their number as a warning.
 #pragma once
 
+#include <climits>
 #include <string>
 #include <vector>
 
@@ -36,6 +38,7 @@ class WavStream : public DPipeAudioStream {
 
     const WavHeader& header() const { return header_; }
     long long clipped() const { return clipped_; }
+    void countClippedWithin(long long from, long long to);
 
   private:
     WavHeader header_;
@@ -43,7 +46,8 @@ class WavStream : public DPipeAudioStream {
     wav::Convert convert_ = nullptr;     // null: what is read is delivered
     std::vector<unsigned char> stored_;  // values as the file has them, on their way through convert_
     long long clipped_ = 0;              // values
-    long long counted_ = 0;              // samples of which the clipped values are counted
+    long long counted_ = 0;              // before this sample the clipped values are counted, or do not count
+    long long countEnd_ = LLONG_MAX;     // nor do those from this one on
 
     int readPlain(int count);
     int readConverted(int count);
@@ -75,4 +79,5 @@ class WavDec : public BaseDecodePipe {
 
     WavStream& wavStream(int stream) const;
     int setAll(const Any& value);
+    int setClipRange(const Any& value);
 };

@@ -81,9 +81,16 @@ class Measurement {
         return std::max(std::min(range.to, range.decoder->nrSamples(range.stream)) - range.from, 0LL);
     }
 
-    bool measure(const QvPcm& pcm) {
+    // What changes the number of channels makes others of them.
+    static long long placesOf(const QvPcm& pcm, const qvchain::SoundRange& range) {
+        const Any mask = range.decoder->getAudioParam(range.stream, "channelMask");
+        const Any channels = range.decoder->getAudioParam(range.stream, "channels");
+        return mask.isInt() && channels == Any(pcm.channels()) ? mask.toInt64() : 0;
+    }
+
+    bool measure(const QvPcm& pcm, const qvchain::SoundRange& range) {
         if (!metering_) {
-            if (meter_.init(pcm.channels(), pcm.samplerate()) != QvStatus::ok)
+            if (meter_.init(pcm.channels(), pcm.samplerate(), placesOf(pcm, range)) != QvStatus::ok)
                 return failed("the meter does not work with " + std::to_string(pcm.channels()) +
                               " channels at " + std::to_string(pcm.samplerate()) + " Hz");
             metering_ = true;
@@ -106,7 +113,7 @@ class Measurement {
                 return failed(std::string("can not read samples: ") + range.decoder->errorDesc());
             const QvPcm* pcm = range.decoder->getAudioPtr(range.stream);
             const int count = pcm && pcm->inited() ? pcm->samples() : 0;
-            if (count > 0 && !measure(*pcm)) return false;
+            if (count > 0 && !measure(*pcm, range)) return false;
             if (result == QvStatus::endOfStream || count < 1) break;
             left -= count;
             if (!goOn(left, all)) return false;
@@ -130,7 +137,7 @@ class Measurement {
             if (!pcm) break;
             QvPcm due = *pcm;  // the same samples, counted up to the end only
             due.setSamples(static_cast<int>(std::min<long long>(pcm->samples(), left)));
-            if (!measure(due)) return false;
+            if (!measure(due, range)) return false;
             left -= due.samples();
             chain->erase(pcm->samples());
             if (!goOn(left, all)) return false;

@@ -22,15 +22,26 @@ struct Closed {
     void operator()(ebur128_state* state) const { ebur128_destroy(&state); }
 };
 
+// Places in a channel mask.
+constexpr unsigned lowFrequency = 0x8, backs = 0x30, backCentre = 0x100, sides = 0x600, topBacks = 0x38000;
+constexpr unsigned surrounds = backs | backCentre | sides | topBacks;
+
+void mapByMask(ebur128_state& state, int channels, unsigned mask) {
+    for (unsigned i = 0; i < static_cast<unsigned>(channels); ++i) {
+        const unsigned place = mask & (~mask + 1);
+        mask &= ~place;
+        const int counted = place == lowFrequency ? EBUR128_UNUSED
+                            : place & surrounds   ? EBUR128_LEFT_SURROUND
+                                                  : EBUR128_CENTER;
+        ebur128_set_channel(&state, i, counted);
+    }
+}
+
 // Where the library's own order stops to know a channel, it would not count it at all.
-void mapChannels(ebur128_state& state, int channels) {
+void mapByNumber(ebur128_state& state, int channels) {
     if (channels <= 6) return;
-    constexpr std::array<int, 8> eight = {
-        EBUR128_LEFT,          EBUR128_RIGHT,          EBUR128_CENTER,        EBUR128_UNUSED,
-        EBUR128_LEFT_SURROUND, EBUR128_RIGHT_SURROUND, EBUR128_LEFT_SURROUND, EBUR128_RIGHT_SURROUND};
-    for (int i = 0; i < channels; ++i)
-        ebur128_set_channel(&state, static_cast<unsigned>(i),
-                            channels == 8 ? eight[static_cast<std::size_t>(i)] : EBUR128_CENTER);
+    constexpr unsigned eight = 0x63F;  // left, right, centre, low frequency effects, backs, sides
+    mapByMask(state, channels, channels == 8 ? eight : 0);
 }
 
 // One value of `width` bytes with full scale at 2^23.
@@ -86,14 +97,17 @@ QvLoudness::QvLoudness() : state_(std::make_unique<State>()) {}
 
 QvLoudness::~QvLoudness() = default;
 
-int QvLoudness::init(int channels, int samplerate) {
+int QvLoudness::init(int channels, int samplerate, long long channelMask) {
     *state_ = {};
     if (channels < 1 || channels > maxChannels || samplerate < 1) return QvStatus::invalidArgument;
     constexpr int modes = EBUR128_MODE_I | EBUR128_MODE_LRA | EBUR128_MODE_TRUE_PEAK;
     state_->meter.reset(
         ebur128_init(static_cast<unsigned>(channels), static_cast<unsigned long>(samplerate), modes));
     if (!state_->meter) return QvStatus::invalidArgument;
-    mapChannels(*state_->meter, channels);
+    if (const auto mask = static_cast<unsigned>(channelMask))
+        mapByMask(*state_->meter, channels, mask);
+    else
+        mapByNumber(*state_->meter, channels);
     state_->channels = channels;
     const int whole = blockValues - blockValues % channels;
     state_->block.resize(static_cast<std::size_t>(whole));

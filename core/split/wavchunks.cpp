@@ -123,13 +123,13 @@ class Mover {
     }
     uint64_t reference(uint64_t sample) const {
         if (sample > INT64_MAX / 2) return sample;  // no time of any day
-        return static_cast<uint64_t>(scaled(static_cast<long long>(sample) + part_.first));
+        return static_cast<uint64_t>(scaled(std::max(static_cast<long long>(sample) + part_.first, 0LL)));
     }
 
     std::string bext(std::string data) const {
         if (!isBext(data)) return data;
         put(data, bextTimeReference, reference(timeReference(data)), 8);
-        if (versionOf(data) >= bextWithLoudness && (part_.changed || part_.first > 0 || part_.samples >= 0))
+        if (versionOf(data) >= bextWithLoudness && (part_.changed || part_.first != 0 || part_.samples >= 0))
             for (size_t i = 0; i < bextLoudnessBytes; i += 2) put(data, bextLoudness + i, loudnessUnknown, 2);
         return data;
     }

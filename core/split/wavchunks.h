@@ -18,7 +18,7 @@ class QV_API QvWavChunks {
   public:
     // What is taken of a source.
     struct Part {
-        long long first = 0;     // sample of the source
+        long long first = 0;     // sample of the source; below 0: that many of silence come before it
         long long samples = -1;  // of the source; negative: all that follow
         int fromRate = 0;        // samples a second of the source, above 0
         int toRate = 0;          // and of the result, above 0

@@ -1,8 +1,10 @@
+#include <algorithm>
 #include <cmath>
 #include <cstdio>
 
 #include "tarsel/commands/commands.h"
 #include "tarsel/host/console.h"
+#include "tarsel/job/progress.h"
 #include "tarsel/source/source.h"
 #include "tarsel/words/commandline.h"
 #include "tarsel/words/json.h"
@@ -16,15 +18,57 @@ constexpr int kBlock = 65536;  // samples that are read at a time
     throw failure(Msg::loudnessFailed, {source.name(), std::to_string(stream), why});
 }
 
+// On a terminal, of one stream.
+class Shown {
+  public:
+    Shown(const Source& source, int stream)
+        : progress_({}, false, inQuotes(source.name()) + " ", false),
+          samples_(static_cast<double>(source.decoder().nrSamples(stream))),
+          rate_(source.decoder().getAudioParam(stream, "samplerate").asInt32(1)) {
+        if (!progress_.onTerminal()) return;
+        progress_.start();
+        progress_.show(at(0));
+    }
+    ~Shown() {
+        if (progress_.onTerminal()) progress_.finish({});
+    }
+    Shown(const Shown&) = delete;
+    Shown& operator=(const Shown&) = delete;
+    void update(long long measured) {
+        if (progress_.onTerminal() && progress_.due()) progress_.update(at(measured));
+    }
+
+  private:
+    ProgressState at(long long measured) const {
+        ProgressState state;
+        const auto done = static_cast<double>(measured);
+        if (samples_ > 0) state.part = std::min(done / samples_, 1.0);
+        state.outSeconds = done / rate_;
+        state.frame = -1;
+        return state;
+    }
+
+    Progress progress_;
+    double samples_;
+    int rate_;
+};
+
+// The places of the channels as the bits of a mask; 0 where the source does not name them.
+long long placesOf(const QvDecodePipe& decoder, int stream) {
+    const Any mask = decoder.getAudioParam(stream, "channelMask");
+    return mask.isInt() ? mask.toInt64() : 0;
+}
+
 QvLoudness& measure(const Source& source, int stream, QvLoudness& meter) {
     QvDecodePipe& decoder = source.decoder();
     const auto ask = [&](const char* name) { return decoder.getAudioParam(stream, name).asInt32(0); };
     const int channels = ask("channels"), rate = ask("samplerate");
-    const int begun = meter.init(channels, rate);
+    const int begun = meter.init(channels, rate, placesOf(decoder, stream));
     if (begun == QvStatus::outOfMemory) throw std::bad_alloc();
     if (begun != QvStatus::ok)
         refuse(source, stream,
                std::to_string(channels) + " channels at " + std::to_string(rate) + " Hz can't be measured");
+    Shown shown(source, stream);
     for (;;) {
         const int read = decoder.readSamples(kBlock, stream);
         if (read < 0 && read != QvStatus::endOfStream) throw failure(Msg::readFailed, {source.name()});
@@ -33,6 +77,7 @@ QvLoudness& measure(const Source& source, int stream, QvLoudness& meter) {
         const int added = meter.add(*pcm);
         if (added == QvStatus::outOfMemory) throw std::bad_alloc();
         if (added != QvStatus::ok) refuse(source, stream, "its format changes");
+        shown.update(meter.samples());
     }
 }
 
@@ -82,6 +127,7 @@ void measureFile(const std::string& name, bool json, Json& all) {
         QvLoudness meter;
         measure(source, stream, meter);
         if (!json) printLine(meter, stream);
+        if (!json) flushOutput();  // measuring takes its time
         file["streams"].push_back(describe(meter, stream));
     }
     const std::string damage = source.damage();

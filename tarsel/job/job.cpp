@@ -49,6 +49,7 @@ void Job::begin(JobPlan plan) {
     else
         parts_.pipe = makeOutputPipe(parts_.plan, options_.acceptPartial);
     carryChunks(parts_, warnings_);
+    countClipping(parts_);
     parts_.outputs.claim(parts_.plan, filesRead(), *parts_.pipe);
 }
 

@@ -6,3 +6,6 @@
 
 // Gives them to the multiplexer of the job's pipe, and warns once an input of those that are lost.
 void carryChunks(const JobParts& parts, Warnings& warnings);
+
+// Lets the inputs count those clipped samples that the output takes.
+void countClipping(const JobParts& parts);

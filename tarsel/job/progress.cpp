@@ -189,7 +189,8 @@ std::string Progress::line(const ProgressState& state, bool color) const {
                       color ? "\x1b[0m" : "");
         text += part;
     }
-    std::snprintf(part, sizeof part, "  frame %lld  %.1fx", state.frame, speed);
+    if (state.frame >= 0) text += "  frame " + std::to_string(state.frame);
+    std::snprintf(part, sizeof part, "  %.1fx", speed);
     text += part;
     if (eta >= 0)
         text += "  left " + formatTime(std::ceil(eta)).substr(0, formatTime(std::ceil(eta)).size() - 4);

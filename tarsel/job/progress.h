@@ -10,7 +10,7 @@
 
 struct ProgressState {
     double part = -1;       // 0 to 1; negative when unknown
-    long long frame = 0;    // frames of the output written so far
+    long long frame = 0;    // frames of the output written so far; negative where there are none
     double outSeconds = 0;  // their time in the output
     int pass = 1, passes = 1;
     const char* state = "running";

@@ -37,6 +37,13 @@ JoinedSound::JoinedSound(const std::vector<Part>& parts) : parts_(parts) {
     QvDecodePipe::open();
 }
 
+int JoinedSound::setParam(const char* name, const Any& value) {
+    int result = QvStatus::ok;
+    for (const Part& part : parts_)
+        if (const int status = part.decoder->setParam(name, value); result == QvStatus::ok) result = status;
+    return result;
+}
+
 void JoinedSound::getStreamParams(int type, int, AnyDict& params) const {
     params.clear();
     if (type != qvAudioStream) return;

@@ -17,7 +17,7 @@ class JoinedSound : public QvDecodePipe {
 
     using QvDecodePipe::getParam;
     const char* name() const override { return "joined sounds"; }
-    int setParam(const char* name, const Any& value) override { return QvCodec::setParam(name, value); }
+    int setParam(const char* name, const Any& value) override;  // of each part
     int nrStreams(int type) const override { return type == qvAudioStream ? 1 : 0; }
     void getStreamParams(int type, int stream, AnyDict& params) const override;
     int seekToSample(long long sample, int stream) override;

@@ -61,6 +61,13 @@ std::string carryWavChunks(const Source& source, int stream, const WavPart& part
     return listed(lost);
 }
 
+void countClippedWithin(const Source& source, long long from, long long to) {
+    try {
+        source.decoder().setParam("clipRange", AnyVector(Any(from), Any(to)));
+    } catch (const QvParamException&) {  // not one of its parameters
+    }
+}
+
 long long clippedSamples(const Source& source, int stream) {
     return source.decoder().getStreamParam(kAudio, stream, "clippedSamples").asInt64(0);
 }

@@ -117,6 +117,8 @@ TEST_F(SoundOptions, DelaysMoveTheSound) {
     };
     EXPECT_TRUE(out({"transcode", "take.wav", "--delay", "0.25"}) == late);
     EXPECT_TRUE(out({"transcode", "take.wav", "--delay=-0.25"}) == early);
+    makeWav("empty.wav", 0);
+    EXPECT_TRUE(out({"transcode", "empty.wav", "--delay", "0.25"}).empty());
     EXPECT_TRUE(out({"transcode", "take.wav", "--delay", "0.25", "--to", "0.25"}) ==
                 late.substr(0, 24000 * 4));
     const auto beside = [&](const char* delay) {
@@ -239,6 +241,12 @@ TEST_F(SoundOptions, WhatCanNotBeDoneIsRefused) {
              {{"--delay", "3f"}, {"'3f' counts frames, but the input has no frame rate"}}});
     refuses({"transcode", "crowd.wav", "-o", "no.wav"},
             {{{"--channels", "2"}, {"40 channels to 2", "--map"}}});
+    makeWav("eight.wav", 100, 8);
+    works({"transcode", "eight.wav", "--filter", "avol:volume=-3,_front=1", "-o", "eight_out.wav",
+           "--save-task", "eight.xml"});
+    makeWav("eight.wav", 100, 10);
+    fails(2, {"run", "eight.xml", "-o", "no.wav"},
+          {"--filter avol: the sound has 10 channels, and it works on 8"});
     fails(2, asYuv({"transcode", "clip.yuv", "--volume", "3", "-o", "no.yuv"}),
           {"--volume: this job has no sound"});
     works({"transcode", "crowd.wav", "--map", "39,0", "-o", "two.wav"});
@@ -269,6 +277,17 @@ TEST_F(SoundOptions, LoudnessMeasuresEveryFileThatItCan) {
     EXPECT_THAT(o.out, testing::HasSubstr("-inf LUFS, range 0.0 LU, true peak -inf dBTP"));
     EXPECT_THAT(works({"loudness", "--json", "quiet.wav"}).out,
                 testing::HasSubstr("\"integrated_lufs\": null"));
+    // Channel 2 is one of low frequency effects, which does not count.
+    const std::string tones = wavPart(contents("tone.wav"), "data");
+    std::string data;
+    for (size_t i = 0; i < tones.size(); i += 4) data += std::string(4, '\0') + tones.substr(i, 2);
+    for (const unsigned mask : {0x7u, 0xBu})
+        folder.write("low" + std::to_string(mask) + ".wav",
+                     riff(wavChunk("fmt ", wavExtensible(1, 3, 48000, 16, mask)) + wavChunk("data", data)));
+    EXPECT_NEAR(level("low7.wav", "integrated_lufs"), -9.8, 0.3);
+    EXPECT_THAT(works({"loudness", "low11.wav"}).out, testing::HasSubstr("-inf LUFS"));
+    EXPECT_THAT(works({"transcode", "low11.wav", "--normalize", "-o", "n.wav"}).err,
+                testing::HasSubstr("it is too short or too quiet for a loudness"));
     const Outcome some = tarsel({"loudness", "none.wav", "testgen:audio=0,duration=1", "tone.wav"});
     EXPECT_EQ(some.status, 3);
     EXPECT_THAT(some.out, testing::HasSubstr("'tone.wav'\n  audio 0"));

@@ -87,6 +87,15 @@ TEST_F(WavFiles, ClippedSamplesAreCountedOnce) {
             .err,
         testing::HasSubstr(line));
     EXPECT_EQ(tarsel({"transcode", "loud.wav", "-o", "no.wav", "--strict"}).status, 1);
+    // Of a part those in it, however far a conversion reads on.
+    const std::string part = "'loud.wav' goes beyond full scale: 40 samples";
+    for (const Words& options : {Words{}, {"--samplerate", "48000"}, {"--normalize"}, {"--map", "1,0"}})
+        EXPECT_THAT(
+            works(Words{"transcode", "loud.wav", "--from", "0.5", "--to", "0.75", "-o", "out.wav", "-y"} +
+                  options)
+                .err,
+            testing::HasSubstr(part))
+            << testing::PrintToString(options);
 }
 
 TEST_F(WavFiles, WordsAndMarksFollowTheCut) {
@@ -109,6 +118,20 @@ TEST_F(WavFiles, WordsAndMarksFollowTheCut) {
 
     works({"transcode", "take.wav", "--from", "1", "--samplerate", "16000", "-o", "out.wav", "-y"});
     EXPECT_EQ(wavPart(out(), "bext"), bext(2016000));
+
+    // A delay moves the sound, and with it what is said of its samples.
+    works({"transcode", "take.wav", "--delay", "0.5", "--to", "1.5", "-o", "late.wav"});
+    const std::string late = contents("late.wav");
+    EXPECT_EQ(wavPart(late, "bext"), bext(996000));
+    EXPECT_EQ(wavPart(late, "cue "), cue({4100, 12000, 16000}));
+    works({"transcode", "take.wav", "--delay=-1.2", "-o", "early.wav"});
+    EXPECT_EQ(wavPart(contents("early.wav"), "bext"), bext(1009600));
+    EXPECT_EQ(leNumber(wavPart(contents("early.wav"), "cue "), 0, 4), 1u);
+    EXPECT_EQ(leNumber(wavPart(contents("early.wav"), "cue "), 4 + 20, 4), 2400u);
+    const Outcome joined = works({"transcode", "take.wav", "late.wav", "--map", "0,a:1.0", "-o", "two.wav"});
+    EXPECT_THAT(joined.err,
+                testing::HasSubstr("'take.wav': the output can't keep bext, LIST, cue, smpl and id3"));
+    EXPECT_THAT(joined.err, testing::HasSubstr("'late.wav': the output can't keep bext, LIST and cue of it"));
 
     const Outcome o = works({"info", "out.wav"});
     for (const char* part :

@@ -24,16 +24,19 @@ constexpr int mostChannels = 16, mostSources = 16;
 
 bool isSilent(int channel) { return channel == -1 || channel == -2; }
 
-// The input channels that an entry names; none: silence. nullopt for what is no entry.
+// The input channels that an entry names; none: silence. Several may have silent ones among them, as those of
+// a sound that is not there. nullopt for what is no entry.
 std::optional<std::vector<int>> sourcesOf(const Any& entry) {
     if (entry.isInt32() && isSilent(entry.asInt32())) return std::vector<int>();
     if (entry.isInt32() && entry.asInt32() >= 0) return std::vector<int>{entry.asInt32()};
     if (!entry.isVector() || entry.asVector().size() > mostSources) return std::nullopt;
     std::vector<int> sources;
     for (const Any& channel : entry.asVector()) {
-        if (!channel.isInt32() || channel.asInt32() < 0) return std::nullopt;
+        if (!channel.isInt32() || (channel.asInt32() < 0 && !isSilent(channel.asInt32())))
+            return std::nullopt;
         sources.push_back(channel.asInt32());
     }
+    if (std::all_of(sources.begin(), sources.end(), isSilent)) sources.clear();
     return sources;
 }
 
@@ -53,6 +56,12 @@ void copyChannel(Out to, In from, size_t samples) {
 
 int32_t wrapped(uint32_t sum) { return static_cast<int32_t>(sum); }
 
+uint32_t valueOf(In from, int source, size_t sample) {
+    return isSilent(source)
+               ? 0U
+               : static_cast<uint32_t>(from.first[sample * from.channels + static_cast<size_t>(source)]);
+}
+
 void meanOfTwo(Out to, In a, In b, size_t samples) {
     for (size_t i = 0; i < samples; ++i) {
         const auto x = static_cast<uint32_t>(a.first[i * a.channels]);
@@ -61,12 +70,16 @@ void meanOfTwo(Out to, In a, In b, size_t samples) {
     }
 }
 
+// The mean of a channel and silence.
+void halfOf(Out to, In from, size_t samples) {
+    for (size_t i = 0; i < samples; ++i) to.first[i * to.channels] = from.first[i * from.channels] >> 1;
+}
+
 void meanOfMore(Out to, In from, const std::vector<int>& sources, size_t samples) {
     const auto count = static_cast<int32_t>(sources.size());
     for (size_t i = 0; i < samples; ++i) {
         uint32_t sum = 0;
-        for (const int source : sources)
-            sum += static_cast<uint32_t>(from.first[i * from.channels + static_cast<size_t>(source)]);
+        for (const int source : sources) sum += valueOf(from, source, i);
         to.first[i * to.channels] = wrapped(sum) / count;
     }
 }
@@ -76,7 +89,10 @@ void makeChannel(Out to, In from, const std::vector<int>& sources, size_t sample
     switch (sources.size()) {
         case 0: return;
         case 1: return copyChannel(to, channel(0), samples);
-        case 2: return meanOfTwo(to, channel(0), channel(1), samples);
+        case 2:
+            if (isSilent(sources[0])) return halfOf(to, channel(1), samples);
+            if (isSilent(sources[1])) return halfOf(to, channel(0), samples);
+            return meanOfTwo(to, channel(0), channel(1), samples);
         default: return meanOfMore(to, from, sources, samples);
     }
 }
@@ -100,7 +116,7 @@ int ChConvert::readMatrix() {
             return setError(
                 QvStatus::failed,
                 "the channel matrix has an invalid entry for output channel %d: a channel from 0 on, "
-                "-1 for silence, or at most %d channels whose mean it is",
+                "-1 for silence, or at most %d of these whose mean it is",
                 i, mostSources);
         sources_.push_back(*sources);
         for (const int source : *sources) highest_ = std::max(highest_, source);

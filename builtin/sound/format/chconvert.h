@@ -3,8 +3,8 @@
 //   "connMatrix"   Vector   an entry for each output channel, at most 16:
 //                           an integer from 0 on    that input channel
 //                           -1 or -2                silence
-//                           a Vector of integers    the mean of those input channels, at most 16; empty:
-//                           silence
+//                           a Vector of integers    the mean of these, at most 16, where -1 and -2 count as
+//                                                   silence; empty: silence
 //
 // Samples are 32 bits wide. The mean of two rounds down, that of more toward zero; sums are taken modulo
 // 2^32.

@@ -88,6 +88,11 @@ void checkCounts(const JobPlan& plan) {
     }
 }
 
+void checkFit(const JobPlan& plan, const PlanOptions& options) {
+    checkCounts(plan);
+    checkChannels(plan, options);
+}
+
 // As captions, of which raw pictures hold none.
 void warnOfUnused(JobPlan& plan, const PlanOptions& options) {
     const auto isLeft = [&](const JobInput& input, int type) {
@@ -160,8 +165,7 @@ void checkDamage(JobPlan& plan, bool acceptPartial) {
 
 void checkOutput(JobPlan& plan, const PlanOptions& options) {
     checkKinds(plan, options);
-    checkCounts(plan);
-    checkChannels(plan, options);
+    checkFit(plan, options);
 }
 
 JobPlan planJob(const PlanOptions& options, const OutputForm& output, std::vector<JobInput> inputs,
@@ -176,12 +180,9 @@ JobPlan planJob(const PlanOptions& options, const OutputForm& output, std::vecto
     FilterPlanner filters(plan, effects, known ? known->pictures : std::vector<PictureFormat>());
     if (!known) checkKinds(plan, options);
     if (plan.streams.empty()) throw failure(Msg::segmentNoStreams, {plan.inputs.front().name});
-    SoundPlanner sounds(plan, options);
-    if (!known) {
-        checkCounts(plan);
-        checkChannels(plan, options);
-        warnOfUnused(plan, options);
-    }
+    SoundPlanner sounds(plan, options);  // its map decides which sounds there are
+    if (!known) checkFit(plan, options);
+    if (!known) warnOfUnused(plan, options);
     planPoints(plan, {options.from, options.to, options.duration});
     sounds.planDelays();
     planEnds(plan, options.shortest, options.longest);

@@ -29,9 +29,9 @@ long long ownSamples(const JobPlan& plan, const PlannedStream& stream) {
         return later < end ? later : end;
     };
     const StreamPart& part = stream.part;
-    // Nothing at all is not delayed either.
-    const MediaTime out = part.in < part.out ? part.out + stream.delayed : part.out;
-    return QvSampleRange(moved(part.in), moved(out), source.sound.samplerate, stream.sound.samplerate).out;
+    return QvSampleRange(moved(part.in), moved(part.out + stream.delayed), source.sound.samplerate,
+                         stream.sound.samplerate)
+        .out;
 }
 
 MediaTime ownLength(const JobPlan& plan, const PlannedStream& stream) {

@@ -58,6 +58,13 @@ MediaTime skippedSound(const AnyVector& filters, const SoundFormat& in, const So
     return skipped;
 }
 
+void checkChannels(const AnyDict& filter, const SoundFormat& in, const SoundFormat& out) {
+    const int channels = filter.get("_front").isTrue() ? in.channels : out.channels;
+    if (const int most = mostChannels(filter, channels); channels > most)
+        throw failure(Msg::filterChannels,
+                      {filter.getString("name", ""), std::to_string(channels), std::to_string(most)});
+}
+
 SoundPlanner::SoundPlanner(JobPlan& plan, const PlanOptions& options)
     : plan_(plan), options_(options), volumes_(parseVolumes(options.sound.volumes)) {
     checkOptions();
@@ -142,8 +149,9 @@ void SoundPlanner::planDelay(PlannedStream& stream) const {
         if (video != plan_.streams.end()) rate = video->picture.rate;
         const AnyDict state = delayState(parseDelay(given, rate));
         delays.append(Any(state));
-        // What the user lets come later is not to lose its end.
-        if (const int ms = state.getInt32("delay", 0); ms > 0) stream.delayed = MediaTime(ms / 1000.0);
+        // What the user lets come later is not to lose its end. Nothing at all is not delayed either.
+        const int ms = state.getInt32("delay", 0);
+        if (ms > 0 && stream.part.in < stream.part.out) stream.delayed = MediaTime(ms / 1000.0);
     }
     if (delays.empty()) return;
     stream.skipped = skippedSound(delays, plan_.source(stream).sound, stream.sound);
@@ -172,11 +180,7 @@ void SoundPlanner::addGiven(PlannedStream& stream) const {
     for (const auto& spec : options_.effects.filters) {
         if (filterType(spec) != qvAudioStream) continue;
         const AnyDict filter = filterState(spec);
-        const int channels =
-            filter.get("_front").isTrue() ? plan_.source(stream).sound.channels : stream.sound.channels;
-        if (const int most = mostChannels(filter, channels); channels > most)
-            throw failure(Msg::filterChannels,
-                          {nameOf(spec), std::to_string(channels), std::to_string(most)});
+        checkChannels(filter, plan_.source(stream).sound, stream.sound);
         stream.filters.appendFilter(spec.c_str(), filter);
         stream.chain.push_back(spec);
     }

@@ -16,6 +16,9 @@ struct SoundFormat;
 // that can't be built.
 MediaTime skippedSound(const AnyVector& filters, const SoundFormat& in, const SoundFormat& out);
 
+// Throws Failure where a stored filter would leave channels of the sound unwritten.
+void checkChannels(const AnyDict& filter, const SoundFormat& in, const SoundFormat& out);
+
 class SoundPlanner {
   public:
     // Takes the channels of --map, with which the sounds of the job are one. Both have to outlive it. Throws

@@ -79,8 +79,11 @@ PlannedStream plannedStream(JobPlan& plan, const TransLink& link, int input) {
     if (const auto conversion = params.audioConversion()) stream.conversion = *conversion;
     if (const auto filters = params.filters()) stream.filters = *filters;
     readFilters(stream, plan.filterFiles);
-    if (!stream.isVideo() && !stream.filters.empty())
-        stream.skipped = skippedSound(stream.filters.getVector("customFilters"), source.sound, stream.sound);
+    if (stream.isVideo() || stream.filters.empty()) return stream;
+    const AnyVector filters = stream.filters.getVector("customFilters");
+    stream.skipped = skippedSound(filters, source.sound, stream.sound);
+    for (const Any& filter : filters)
+        if (filter.isDict()) checkChannels(filter.asDict(), source.sound, stream.sound);
     return stream;
 }
 

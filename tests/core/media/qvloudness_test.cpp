@@ -87,6 +87,24 @@ TEST(QvLoudness, ChannelsWeighByTheirPlace) {
         EXPECT_NEAR(meter.samplePeak(), -20, 0.01) << "peaks are of all channels";
         EXPECT_NEAR(meter.rms(), -23.01 - 10 * std::log10(channels), 0.01);
     }
+    // Where a mask gives the places: 2.1, film with one back, 6.1, four with heights, bits that are too few.
+    struct {
+        long long mask;
+        int channels, channel;
+        double loudness;
+    } const places[] = {{0xB, 3, 2, none},      {0x107, 4, 2, -23},   {0x107, 4, 3, -21.5},
+                        {0x70F, 7, 3, none},    {0x70F, 7, 4, -21.5}, {0x70F, 7, 6, -21.5},
+                        {0xFF, 8, 6, -23},      {0xFF, 8, 4, -21.5},  {0x5003, 4, 3, -23},
+                        {0x28003, 4, 3, -21.5}, {0x8, 2, 1, -23},     {0x8, 2, 0, none}};
+    for (const auto& [mask, channels, channel, loudness] : places) {
+        QvLoudness meter;
+        ASSERT_EQ(meter.init(channels, 48000, mask), 0);
+        add(meter, {{2, -20}}, channels, {channel}, 48000);
+        if (loudness == none)
+            EXPECT_EQ(meter.integrated(), none) << mask << ", " << channel;
+        else
+            EXPECT_NEAR(meter.integrated(), loudness, 0.1) << mask << ", " << channel;
+    }
 }
 
 TEST(QvLoudness, WidthsAgree) {

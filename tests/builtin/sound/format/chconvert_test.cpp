@@ -74,6 +74,14 @@ TEST(ChConvert, TakesIntegersAndSilence) {
         << "memory of the output that is reused";
 }
 
+// A source that is not there counts as silence.
+TEST(ChConvert, MixesSilence) {
+    const auto row = [](std::vector<int> sources) { return matrixOf({sources})[0]; };
+    Opened filter{
+        {"connMatrix", AnyVector(row({1, -1}), row({-2, 1}), row({0, -1, 1}), row({-1, -2}), row({-1}))}};
+    EXPECT_EQ(throughFilter(filter, {7, 9, -7, -9}, 2), (Values{4, 4, 5, 0, 0, -5, -5, -5, 0, 0}));
+}
+
 TEST(ChConvert, RefusesWhatIsNoMatrix) {
     AnyVector tooMany, tooManySources;
     for (int i = 0; i < 17; ++i) {
@@ -90,7 +98,7 @@ TEST(ChConvert, RefusesWhatIsNoMatrix) {
         {AnyVector(Any("0")), "invalid entry for output channel 0"},
         {AnyVector(Any(1.0)), "invalid entry for output channel 0"},
         {AnyVector(Any(tooManySources)), "invalid entry for output channel 0"},
-        {AnyVector(Any(AnyVector(Any(0), Any(-1)))), "invalid entry for output channel 0"},
+        {AnyVector(Any(AnyVector(Any(0), Any(-3)))), "invalid entry for output channel 0"},
         {AnyVector(Any(AnyVector(Any("a")))), "invalid entry for output channel 0"},
     };
     for (const auto& row : rows) {
