@@ -160,13 +160,33 @@ class Draining : public QvBufStreamFifoCb {
   public:
     void cbProgress(int bytes) override {
         calls.push_back(bytes);
-        if (drain) text += copyOut(output(), static_cast<unsigned>(bytes));
+        if (refusing) throw 5;
+        text += copyOut(output(), static_cast<unsigned>(bytes));
     }
 
     std::vector<int> calls;
     std::string text;
-    bool drain = true;
+    bool refusing = false;
 };
+
+// What the consumer did not take stays in the ring; it is called again for new bytes, not for those that it
+// refused.
+TEST(QvBufStreamFifoCb, AConsumerThatThrowsIsNotCalledAgainForTheSameBytes) {
+    Draining fifo;
+    ASSERT_EQ(fifo.init(AnyDict("size", 100, "chunk", 21, "callback", 10)), 0);
+    bufstream* in = fifo.input();
+    fifo.refusing = true;
+    EXPECT_THROW(put(in, "0123456789"), int);
+    EXPECT_THROW(copyIn(in, "abcdefghijkl"), int);
+    fifo.refusing = false;
+    EXPECT_TRUE(put(in, "ABCDE"));
+    EXPECT_EQ(copyIn(in, "FGHI"), 4u);
+    EXPECT_THAT(fifo.calls, testing::ElementsAre(10, 12));
+    EXPECT_TRUE(put(in, "J"));
+    EXPECT_THAT(fifo.calls, testing::ElementsAre(10, 12, 10));
+    EXPECT_EQ(fifo.text, "0123456789");
+    EXPECT_EQ(copyOut(fifo.output(), 20), "abcdefghijklABCDEFGH");
+}
 
 TEST(QvBufStreamFifoCb, CallsAtTheThresholdAndStopsOnWish) {
     Draining fifo;

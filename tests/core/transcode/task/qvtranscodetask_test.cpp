@@ -58,6 +58,7 @@ TEST(TaskChecks, CodedSoundThatPassesThrough) {
     FakePlugin plugin;
     plugin.audio("aquant").add(new QvAfModule);
     for (const auto& row : rows) {
+        SCOPED_TRACE(&row - rows);
         Job job;
         auto encoder = std::make_unique<DolbyEncoder>();
         encoder->params = job.pipe.audios[0]->params;
@@ -71,9 +72,14 @@ TEST(TaskChecks, CodedSoundThatPassesThrough) {
         EXPECT_EQ(job.task.checkLegal(messages), row.result);
         ASSERT_EQ(messages.size(), row.result ? 1 : 0);
         EXPECT_STREQ(row.result ? messages.at(0).asString() : "", row.text);
-        NotedTranscoder t(job.events, &job.task);
-        if (row.result == QvStatus::notLegal) {
-            EXPECT_EQ(t.transcode(true), QvStatus::notLegal);
+        const bool runs = row.result != QvStatus::notLegal;
+        for (const bool synchronous : {true, false}) {
+            NotedTranscoder t(job.events, &job.task);
+            ASSERT_EQ(t.transcode(synchronous), runs && synchronous ? 0 : row.result);
+            if (runs) job.events.waitFor("close done0");
+            EXPECT_EQ(job.events.take().empty(), !runs);
+            EXPECT_EQ(t.errorCode(), row.result) << "a warning stays";
+            EXPECT_STREQ(t.errorDesc(), row.text);
         }
     }
 }
