@@ -112,7 +112,7 @@ TEST_F(Subtitle, FilesWithoutSubtitles) {
         SubtitleWriter writer;
         writer.init();
         writer.setParam("subtitle_filename", name.c_str());
-        EXPECT_EQ(writer.open(), -9) << name;
+        EXPECT_EQ(writer.open(), QvStatus::cannotParse) << name;
         EXPECT_EQ(std::string(writer.errorDesc()), "Failed to read subtitle file " + name);
     }
     file_.clear();

@@ -5,6 +5,7 @@
 #include <deque>
 #include <random>
 
+#include "core/engine/status.h"
 #include "tests/core/stream/streamtools.h"
 
 namespace {
@@ -23,8 +24,9 @@ struct Ring : testing::Test {
 };
 
 // Any order of the four ways in and out against a queue. Writers keep one byte free, as they must.
+template <class Fifo = QvBufStreamFifo>
 void driveAgainstModel(unsigned size, unsigned chunk, int steps, unsigned seed) {
-    QvBufStreamFifo fifo;
+    Fifo fifo;
     ASSERT_EQ(fifo.init(ring(static_cast<int>(size), static_cast<int>(chunk))), 0);
     bufstream *const in = fifo.input(), *const out = fifo.output();
     std::deque<unsigned char> model;
@@ -78,6 +80,15 @@ TEST(QvBufStreamFifo, IsAQueueWhateverTheOrderOfOperations) {
     driveAgainstModel(1000, 11, 200'000, 3);
     driveAgainstModel(256, 129, 150'000, 4);
     driveAgainstModel(3, 2, 50'000, 5);
+    driveAgainstModel<QvBufFifoDbg>(61, 17, 2000, 6);
+}
+
+TEST_F(Ring, ANewSizeThrowsAwayWhatIsIn) {
+    put(in, "abc");
+    ASSERT_EQ(fifo.resize(40, 11), 0);
+    EXPECT_EQ(usable(fifo.output()), 0u);
+    EXPECT_EQ(usable(fifo.input()), 40u);
+    EXPECT_EQ(copyIn(fifo.input(), patternBytes(40)), 40u);
 }
 
 TEST(QvBufStreamFifo, SizesThatMakeNoRingAreAsserted) {
@@ -146,6 +157,19 @@ TEST(QvBufStreamFifo, FlushThrowsAwayAndObserversHearInOrder) {
     bufstream* in = fifo.input();
     EXPECT_EQ(tell(in, QvAuxId::SAMPLE_INFO, 1, 7), 0u);
     EXPECT_THAT(heard, testing::ElementsAre("1 SAMPLE_INFO/7/4", "2 SAMPLE_INFO/7/4"));
+    EXPECT_STREQ(qvAuxInfoName(5), "?");
+    heard.clear();
+    struct Leaving : QvAuxInfoObserver {
+        explicit Leaving(QvBufStream& from) : from_(from) {}
+        void auxInfo(unsigned, unsigned, void*, unsigned) override { from_.unregisterObserver(this); }
+        QvBufStream& from_;
+    } leaving(fifo);
+    EXPECT_EQ(fifo.unregisterObserver(&second), 0);
+    fifo.registerObserver(&leaving);
+    fifo.registerObserver(&second);
+    tell(in, QvAuxId::SAMPLE_INFO);
+    EXPECT_EQ(heard.size(), 2u) << "the one after the one that left hears as well";
+    EXPECT_EQ(fifo.unregisterObserver(&leaving), QvStatus::failed);
     EXPECT_EQ(fifo.unregisterObserver(&first), 0);
     EXPECT_EQ(fifo.unregisterAllObservers(), 0);
     tell(in, QvAuxId::SAMPLE_INFO);

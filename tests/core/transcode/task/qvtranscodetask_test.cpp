@@ -15,8 +15,8 @@ TEST(TaskParams, ALinksOwnWinOverTheTasks) {
     ProcessParams own(AnyDict("inOutPoints", points, "chapters", AnyVector(Any(5)), "smartRender", 2));
     own.setHoldLast(true);
     own.set("filters", AnyDict());
-    ASSERT_EQ(job.task.link(&job.decoder, 1, 0, 0, own), 0);
-    ASSERT_EQ(job.task.link(&job.decoder, 2, 0, 0), 1);
+    ASSERT_EQ(job.task.link(&job.decoder, qvVideoStream, 0, 0, own), 0);
+    ASSERT_EQ(job.task.link(&job.decoder, qvAudioStream, 0, 0), 1);
     job.task.setProcessParams(ProcessParams(AnyDict("inOutPoints", otherPoints, "smartRender", 1)), 0);
     job.task.setProcessParams(ProcessParams(AnyDict("filters", AnyDict("a", 1))), 1);
     job.task.setProcessParams(
@@ -99,7 +99,7 @@ struct Stored {
         made->store(encoder);
         state = AnyDict("__version__", "2.0", "__class__", "TranscodeTask", "encoder", encoder, "files",
                         AnyVector(Any(AnyDict("filename", input.c_str()))), "postProcess", "true %i");
-        setStream(2, input, 0,
+        setStream(qvAudioStream, input, 0,
                   AnyDict("inOutPoints", AnyVector(Any(MediaTime(0.001)), Any(MediaTime(0.006)))));
     }
     ~Stored() { decoders.deleteAll(); }
@@ -168,8 +168,8 @@ TEST(TaskState, DamageIsToldAndNothingIsLeft) {
         {[](Stored& s) { s.state.remove("files"); },
          "Task.restore: invalid task state structure - no input file(s) specified"},
         {[](Stored& s) { s.setFile(AnyDict("filename", "/nowhere.wav")); }, unopened},
-        {[](Stored& s) { s.setStream(1, s.input, 0, {}); }, ""},
-        {[](Stored& s) { s.setStream(2, "/other.wav", 0, {}); },
+        {[](Stored& s) { s.setStream(qvVideoStream, s.input, 0, {}); }, ""},
+        {[](Stored& s) { s.setStream(qvAudioStream, "/other.wav", 0, {}); },
          "no available decoders, decoder must be cloned..."},
     };
     for (const auto& row : rows) {
