@@ -59,6 +59,17 @@ TEST_F(Testgen, TheCardHasARoundCircle) {
     const int x = 12 * 320 / 16, y = 8 * 256 / 16, radius = 3 * 256 / 16;
     for (const auto& [dx, dy] : {std::pair{radius, 0}, {-radius, 0}, {0, radius}, {0, -radius}})
         EXPECT_EQ(*frame.pixelPtr(x + dx, y + dy), 255) << dx << " " << dy;
+
+    // The digits of the timecode fill about half of its box, 7 by 2 units at the lower left.
+    const int left = 256 / 32, top = 256 - 4 - 3 * 16, background = *frame.pixelPtr(left, top);
+    int rows = 0;
+    for (int row = top; row < top + 32; ++row) {
+        const unsigned char* line = frame.pixelPtr(left, row);
+        bool digits = false;
+        for (int i = 0; i < 112; ++i) digits |= line[i * frame.pixelBytes()] != background;
+        rows += digits;
+    }
+    EXPECT_NEAR(rows, 16, 8);
 }
 
 TEST_F(Testgen, GrayBarsStandStill) {

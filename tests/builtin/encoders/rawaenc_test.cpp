@@ -77,6 +77,11 @@ TEST_F(RawAudio, RefusesWhatDoesNotFit) {
     EXPECT_EQ(write(10), QvStatus::failed);
     EXPECT_STREQ(enc().errorDesc(), "Error in raw audio encoder, can not allocte buffer, size=40");
     EXPECT_EQ(enc().setParam("channels", 33), QvStatus::invalidParam);
+    for (const std::string name : {"channels", "samplerate", "bitsPerSample"}) {
+        const Any range = static_cast<const QvCodec&>(enc()).getParam((name + "Range").c_str());
+        for (const Any& offered : range.asVector())
+            EXPECT_EQ(enc().setParam(name.c_str(), offered), 0) << name << offered.toInt32();
+    }
     EXPECT_EQ(enc().setParam("bitsPerSample", 0), QvStatus::invalidParam);
 }
 

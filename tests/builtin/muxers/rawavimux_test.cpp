@@ -326,6 +326,9 @@ TEST_F(RawAvi, WhatItCanNotHold) {
 TEST_F(RawAvi, OtherWaysOfWriting) {
     addVideo(QvFourcc::v210, 50, 20);
     addAudio(2, 16, 48000);
+    const auto rateOf = [](const QvCodec& codec) { return codec.getParam("estimateSecKb").toDouble(); };
+    EXPECT_EQ(rateOf(*pipe_->audioEncoder(0)), 187.5);
+    EXPECT_EQ(rateOf(*pipe_->getMuxer()), 187.5 + rateOf(*pipe_->videoEncoder(0)));
     ASSERT_EQ(pipe_->open(), 0);
     const std::string data = patternBytes(3 * 128 * 2 * 20);
     auto* out = pipe_->videoStream(0)->bitstream->input();
