@@ -86,18 +86,6 @@ TEST_F(RawVideo, PacksPaddedRows) {
     EXPECT_TRUE(out_.data == pictureBytes(packed));
 }
 
-TEST_F(RawVideo, TheNextRunMayHaveAnotherHeight) {
-    for (const int height : {32, 48, 20}) {
-        format(QvFourcc::GRAY, 32, height, true);
-        out_.data.clear();
-        start();
-        QvFrame frame = makePicture(QvFourcc::GRAY, 32, height, static_cast<unsigned>(height));
-        ASSERT_EQ(enc().writeFrame(&frame), 0);
-        ASSERT_EQ(enc().close(), 0);
-        EXPECT_TRUE(out_.data == pictureBytes(frame)) << height;
-    }
-}
-
 TEST_F(RawVideo, StalledOutputHoldsTheFourthFrame) {
     stall();
     auto fourth = std::async(std::launch::async, [&] { return enc().writeFrame(&gray_); });

@@ -98,6 +98,7 @@ TEST(VideoPipe, PassesTheDecodersErrorOn) {
     FakeDecoder decoder(9, QvFramerate::f25p());
     decoder.failAt = 1;
     Pipe pipe({"a"});
+    EXPECT_EQ(pipe.process(&decoder, 0), QvStatus::failed) << "not open";
     ASSERT_EQ(pipe.open(), 0);
     EXPECT_EQ(pipe.process(&decoder, 0), 0);
     pipe.next();
