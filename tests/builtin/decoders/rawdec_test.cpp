@@ -1,5 +1,6 @@
 #include "builtin/decoders/rawdec.h"
 
+#include "core/engine/status.h"
 #include "tests/support/checks.h"
 #include "tests/support/engine.h"
 #include "tests/support/pictures.h"
@@ -49,7 +50,7 @@ TEST_F(Raw, FramesComeInOrderAndAfterSeeks) {
         return bytes.substr(static_cast<std::size_t>(i) * frameBytes, frameBytes);
     };
     for (int i = 0; i < 5; ++i) EXPECT_EQ(next(i), frame(i));
-    EXPECT_EQ(decoder.readFrame(0), -4);
+    EXPECT_EQ(decoder.readFrame(0), QvStatus::endOfStream);
     for (const int i : {3, 0, 4}) {
         ASSERT_EQ(decoder.seekToFrame(i, 0), 0);
         EXPECT_EQ(next(i), frame(i));
@@ -77,7 +78,7 @@ TEST_F(Raw, PartsOfFramesAreToldAndNeverRead) {
         EXPECT_TRUE(decoder.getVideoParam(0, "framesExpected") ==
                     (c.truncated ? Any(c.frames + 1LL) : Any()));
         for (int i = 0; i < c.frames; ++i) EXPECT_EQ(decoder.readFrame(0), 0);
-        EXPECT_EQ(decoder.readFrame(0), -4);
+        EXPECT_EQ(decoder.readFrame(0), QvStatus::endOfStream);
     }
 }
 
@@ -112,7 +113,7 @@ TEST_F(Raw, FieldsOneAfterTheOtherAreWoven) {
         EXPECT_EQ(decoder.getFramePtr(0)->framerate.interlaced(), flag);
     }
     ASSERT_EQ(decoder.setParam("height", 3), 0);
-    EXPECT_EQ(decoder.open(), -1) << "an odd height has no two equal fields";
+    EXPECT_EQ(decoder.open(), QvStatus::failed) << "an odd height has no two equal fields";
 }
 
 TEST_F(Raw, SizesAndFormatsThatCanNotBeAreRefused) {
@@ -120,15 +121,33 @@ TEST_F(Raw, SizesAndFormatsThatCanNotBeAreRefused) {
     for (const auto& [width, height] : {Pair(0, 240), {320, -1}, {100000, 100000}, {2147483647, 1}}) {
         decoder.setParam("width", width);
         decoder.setParam("height", height);
-        EXPECT_EQ(open("0123456789"), -1) << width << "x" << height;
+        EXPECT_EQ(open("0123456789"), QvStatus::failed) << width << "x" << height;
         EXPECT_EQ(decoder.getState(), 2);
     }
     const std::pair<const char*, Any> rows[] = {{"FOURCC", "NONE"},   {"FOURCC", 7},         {"framerate", 0},
                                                 {"framerate", 1e300}, {"interlacedFlag", 3}, {"offset", -1}};
-    for (const auto& [name, value] : rows) EXPECT_EQ(decoder.setParam(name, value), -5) << name;
+    for (const auto& [name, value] : rows)
+        EXPECT_EQ(decoder.setParam(name, value), QvStatus::invalidParam) << name;
     set("GRAY", 4, 1);
     decoder.setParam("filename", folder.path().c_str());
     EXPECT_EQ(told(decoder.open()), "-1 Can not open file");
+}
+
+TEST_F(Raw, SettingsAreStored) {
+    const std::pair<const char*, Any> rows[] = {
+        {"FOURCC", "UYVY"},    {"width", 48}, {"height", 20},        {"framerate", QvFramerate(50.0)},
+        {"frameAspect", 1.25}, {"invert", 1}, {"fieldOrderFile", 1}, {"offset", 77}};
+    for (const auto& [name, value] : rows) ASSERT_EQ(decoder.setParam(name, value), 0) << name;
+    AnyDict stored = static_cast<const QvCodec&>(decoder).getParam("store").asDict();
+    EXPECT_EQ(stored.size(), 8);
+    stored.set("name", decoder.name());
+    RawDecoder other;
+    other.init();
+    ASSERT_EQ(other.restore(stored), 0);
+    for (const auto& [name, value] : rows)
+        EXPECT_EQ(static_cast<const QvCodec&>(other).getParam(name),
+                  static_cast<const QvCodec&>(decoder).getParam(name))
+            << name;
 }
 
 TEST_F(Raw, ChangesWhileOpenStartOver) {

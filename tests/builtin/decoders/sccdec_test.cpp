@@ -48,6 +48,7 @@ TEST_F(SccDecoder, ShowsTwoFieldsAsOneStream) {
     ASSERT_EQ(open(one + "," + two), 0);
     EXPECT_TRUE(log.contains("Opened field 1 scc file " + one + ", fr detected as 29.97p"));
     EXPECT_EQ(decoder.nrFrames(0), 32);
+    EXPECT_EQ(decoder.getParam("readRate"), Any(QvFramerate::f29p())) << "as detected";
     EXPECT_EQ(decoder.duration(qvSubpicStream, 0), frameTime(32));
     EXPECT_EQ(decoder.getParam("inOut").asDict(),
               AnyDict("inField1", frameTime(2), "outField1", frameTime(29), "inField2", frameTime(2),

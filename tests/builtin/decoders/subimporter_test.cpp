@@ -5,6 +5,7 @@
 #include <string>
 
 #include "core/engine/log/qvlog.h"
+#include "core/engine/status.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/temp_folder.h"
 
@@ -53,9 +54,10 @@ TEST_F(Importer, DescribesItsStreamAndShowsWhatBelongsToEachFrame) {
     EXPECT_EQ(shown(), "") << "nothing has been read there yet";
     decoder.readFrame(0);
     EXPECT_EQ(shown(), "a|b");
-    for (const long long outside : {-1LL, 1LL << 40}) EXPECT_EQ(decoder.seekToFrame(outside, 0), -4);
+    for (const long long outside : {-1LL, 1LL << 40})
+        EXPECT_EQ(decoder.seekToFrame(outside, 0), QvStatus::endOfStream);
     ASSERT_EQ(decoder.seekToFrame(2147483647, 0), 0);
-    EXPECT_EQ(decoder.readFrame(0), -4);
+    EXPECT_EQ(decoder.readFrame(0), QvStatus::endOfStream);
 }
 
 TEST_F(Importer, FramesMayBeReadAtAnotherRate) {
@@ -70,11 +72,11 @@ TEST_F(Importer, FramesMayBeReadAtAnotherRate) {
 }
 
 TEST_F(Importer, BadFilesAreRefusedOrTold) {
-    EXPECT_EQ(open("a.sub", "{1}{2}a\n{3"), -9);
+    EXPECT_EQ(open("a.sub", "{1}{2}a\n{3"), QvStatus::cannotParse);
     EXPECT_NE(std::string(decoder.errorDesc()).find("a.sub: what follows subtitle 1"), std::string::npos);
-    EXPECT_EQ(open("a.srt", std::string("\0\0\1", 3)), -9);
+    EXPECT_EQ(open("a.srt", std::string("\0\0\1", 3)), QvStatus::cannotParse);
     decoder.setParam("filename", folder.file("none.srt").c_str());
-    EXPECT_EQ(decoder.open(), -9);
+    EXPECT_EQ(decoder.open(), QvStatus::cannotParse);
     LogCapture log;
     EXPECT_EQ(open("a.srt", std::string(srt) + "3\nno times\n\nmore\n"), 0);
     EXPECT_TRUE(log.contains("the last 15 bytes of its text are not read", QvLogMask::warning));

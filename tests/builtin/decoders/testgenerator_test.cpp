@@ -2,6 +2,7 @@
 
 #include <memory>
 
+#include "core/engine/status.h"
 #include "core/media/qvsoundbytes.h"
 #include "tests/support/checks.h"
 #include "tests/support/engine.h"
@@ -50,6 +51,27 @@ TEST_F(Testgen, FramesCountUpFromWhereTheSeekWent) {
     }
 }
 
+// The circle of the card is white at its four ends: 12 units of a 16th from the left, 8 from the top.
+TEST_F(Testgen, TheCardHasARoundCircle) {
+    ASSERT_EQ(openVideo(videoDict(320, 256, 25, 1)), 0);
+    ASSERT_EQ(decoder.readFrame(0), 0);
+    const QvFrame& frame = *decoder.getFramePtr(0);
+    const int x = 12 * 320 / 16, y = 8 * 256 / 16, radius = 3 * 256 / 16;
+    for (const auto& [dx, dy] : {std::pair{radius, 0}, {-radius, 0}, {0, radius}, {0, -radius}})
+        EXPECT_EQ(*frame.pixelPtr(x + dx, y + dy), 255) << dx << " " << dy;
+
+    // The digits of the timecode fill about half of its box, 7 by 2 units at the lower left.
+    const int left = 256 / 32, top = 256 - 4 - 3 * 16, background = *frame.pixelPtr(left, top);
+    int rows = 0;
+    for (int row = top; row < top + 32; ++row) {
+        const unsigned char* line = frame.pixelPtr(left, row);
+        bool digits = false;
+        for (int i = 0; i < 112; ++i) digits |= line[i * frame.pixelBytes()] != background;
+        rows += digits;
+    }
+    EXPECT_NEAR(rows, 16, 8);
+}
+
 TEST_F(Testgen, GrayBarsStandStill) {
     decoder.setParam("mode", "graybar");
     ASSERT_EQ(openVideo(videoDict(221, 64, 25, 1)), 0);
@@ -95,7 +117,7 @@ TEST_F(Testgen, BeepsOnceASecondAndEnds) {
         heard += soundBytes(*decoder.getAudioPtr(0));
         EXPECT_EQ(decoder.getAudioPtr(0)->position() * 4, static_cast<long long>(heard.size()));
     }
-    EXPECT_EQ(result, -4);
+    EXPECT_EQ(result, QvStatus::endOfStream);
     const auto second = soundBytes(*beep).substr(0, 32448 * 4) + std::string((44100 - 32448) * 4, 0);
     EXPECT_TRUE(heard == repeated(second, 3).substr(0, 110250 * 4));
 
@@ -145,6 +167,8 @@ TEST_F(Testgen, BlackAndSilenceAreOfAnyFormat) {
 }
 
 TEST_F(Testgen, MissingParametersAssertAndLeaveItClosed) {
+    EXPECT_EQ(open(AnyVector(), AnyVector()), QvStatus::invalidStructure);
+    EXPECT_EQ(decoder.getState(), QvCodec::stateInitialised);
     const std::pair<const char*, Any> rows[] = {
         {"framerate", Any()}, {"width", 31}, {"picture", "/no/such/picture.png"}};
     for (const auto& [key, value] : rows) {

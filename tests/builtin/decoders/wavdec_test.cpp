@@ -5,6 +5,7 @@
 #include <cmath>
 
 #include "core/engine/log/qvlog.h"
+#include "core/engine/status.h"
 #include "tests/support/checks.h"
 #include "tests/support/pictures.h"
 #include "tests/support/wav_bytes.h"
@@ -55,10 +56,10 @@ TEST_F(Wav, ReadsOfAnySizeAndSeeksGiveTheSameBytes) {
         EXPECT_TRUE(readAll(4096) == data.substr(static_cast<std::size_t>(sample) * 4)) << sample;
     }
     EXPECT_EQ(decoder.readSamples(0, 0), 0);
-    EXPECT_EQ(decoder.readSamples(-1, 0), -4);
-    EXPECT_EQ(decoder.seekToSample(-1, 0), -4);
+    EXPECT_EQ(decoder.readSamples(-1, 0), QvStatus::endOfStream);
+    EXPECT_EQ(decoder.seekToSample(-1, 0), QvStatus::endOfStream);
     EXPECT_EQ(decoder.seekToSample(1LL << 62, 0), 0);
-    EXPECT_EQ(decoder.readSamples(10, 0), -4);
+    EXPECT_EQ(decoder.readSamples(10, 0), QvStatus::endOfStream);
 }
 
 TEST_F(Wav, FindsItsChunksAmongOthers) {
@@ -114,13 +115,13 @@ TEST_F(Wav, RefusesWhatItCanNotRead) {
         {"nothing", "", unparsed},
     };
     for (const auto& c : cases) {
-        EXPECT_EQ(open(c.file), -15) << c.what;
+        EXPECT_EQ(open(c.file), QvStatus::noSegment) << c.what;
         EXPECT_STREQ(decoder.errorDesc(), c.text) << c.what;
         EXPECT_EQ(decoder.getState(), 2) << c.what;
     }
     for (const Any& name : {Any(), Any(""), Any("/no/such/file.wav"), Any(folder.path().c_str())}) {
         decoder.setParam("filename", name);
-        EXPECT_EQ(decoder.open(), -9);
+        EXPECT_EQ(decoder.open(), QvStatus::cannotParse);
         EXPECT_STREQ(decoder.errorDesc(), "Failed to open file for reading");
     }
 }
@@ -130,7 +131,7 @@ TEST_F(Wav, TruncationAtEveryByteIsToldOrRefused) {
     const std::string whole = stereo16(data);
     for (std::size_t length = 0; length <= whole.size(); ++length) {
         if (length < 44) {
-            EXPECT_EQ(open(whole.substr(0, length)), -15) << length;
+            EXPECT_EQ(open(whole.substr(0, length)), QvStatus::noSegment) << length;
             continue;
         }
         ASSERT_EQ(open(whole.substr(0, length)), 0) << length;
@@ -156,7 +157,7 @@ TEST_F(Wav, SizesThatWereNeverWrittenMeanToTheEnd) {
     }
     ASSERT_EQ(open(riff(format + wavChunk("data", "") + wavChunk("LIST", "INFOabcd"))), 0);
     EXPECT_EQ(decoder.nrSamples(0), 0) << "an empty chunk that others follow is empty";
-    EXPECT_EQ(decoder.readSamples(10, 0), -4);
+    EXPECT_EQ(decoder.readSamples(10, 0), QvStatus::endOfStream);
 
     ASSERT_EQ(open("RIFF" + leBytes(36, 4) + "WAVE" + format + "data" + leBytes(0xFFFFFFF0, 4) + data), 0);
     EXPECT_EQ(decoder.nrSamples(0), 500);
@@ -255,7 +256,7 @@ TEST_F(Wav, ExtendedReadsOtherValues) {
             for (const std::string& file : {plain, turned, half, left})
                 for (const int block : {1, 7, 4096}) {
                     decoder.setParam("extended", 0);
-                    EXPECT_EQ(open(file), -15) << c.what;
+                    EXPECT_EQ(open(file), QvStatus::noSegment) << c.what;
                     ASSERT_EQ(openExtended(file), 0) << c.what << decoder.errorDesc();
                     EXPECT_EQ(readAll(block), c.delivered) << c.what;
                     EXPECT_EQ(decoder.getAudioParam(0, "bitsPerSample").toInt32(), c.deliveredBits);
@@ -305,7 +306,7 @@ TEST_F(Wav, ExtendedReadsOtherFiles) {
         const std::string file =
             id + unknown + "WAVE" + ds64 + format + "data" + unknown + data + wavChunk("bext", "abcd");
         decoder.setParam("extended", 0);
-        EXPECT_EQ(open(file), -15);
+        EXPECT_EQ(open(file), QvStatus::noSegment);
         EXPECT_STREQ(decoder.errorDesc(), "Failed to parse WAV file");
         ASSERT_EQ(openExtended(file), 0) << decoder.errorDesc();
         EXPECT_TRUE(readAll(4) == data);
@@ -331,7 +332,7 @@ TEST_F(Wav, ExtendedRefusesWhatItCanNotRead) {
          {wavFormat(1, 2, 48000, 64), wavFormat(1, 2, 48000, 0), wavFormat(3, 2, 48000, 16),
           wavFormat(3, 1, 48000, 24), wavFormat(6, 1, 8000, 16), wavFormat(0x11, 2, 48000, 4),
           wavFormat(1, 0, 48000, 16), wavFormat(1, 257, 48000, 16), wavFormat(3, 2, 0, 32), padded}) {
-        EXPECT_EQ(openExtended(wavOf(format, data)), -15);
+        EXPECT_EQ(openExtended(wavOf(format, data)), QvStatus::noSegment);
         EXPECT_STREQ(decoder.errorDesc(), "WAV format not supported");
     }
 }

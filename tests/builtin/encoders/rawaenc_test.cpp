@@ -67,16 +67,21 @@ TEST_F(RawAudio, LongBuffersGoInWholeSamples) {
 }
 
 TEST_F(RawAudio, RefusesWhatDoesNotFit) {
-    EXPECT_EQ(enc().open(), -1);
+    EXPECT_EQ(enc().open(), QvStatus::failed);
     EXPECT_STREQ(enc().errorDesc(), "Output stream not attached");
     start("rawmux");
     for (const int status : {write(10, 1), write(10, 2, 3), write(10, 2, 2, 11), enc().writePcm(nullptr)})
         EXPECT_EQ(status, QvStatus::invalidArgument);
     EXPECT_TRUE(out_.data.empty());
     out_.failAfter = 0;
-    EXPECT_EQ(write(10), -1);
+    EXPECT_EQ(write(10), QvStatus::failed);
     EXPECT_STREQ(enc().errorDesc(), "Error in raw audio encoder, can not allocte buffer, size=40");
     EXPECT_EQ(enc().setParam("channels", 33), QvStatus::invalidParam);
+    for (const std::string name : {"channels", "samplerate", "bitsPerSample"}) {
+        const Any range = static_cast<const QvCodec&>(enc()).getParam((name + "Range").c_str());
+        for (const Any& offered : range.asVector())
+            EXPECT_EQ(enc().setParam(name.c_str(), offered), 0) << name << offered.toInt32();
+    }
     EXPECT_EQ(enc().setParam("bitsPerSample", 0), QvStatus::invalidParam);
 }
 
@@ -98,7 +103,7 @@ TEST(DummyAudio, HandsParametersAndSamplesToTheMultiplexer) {
     enc.setParam("samplerate", 32000);
     enc.setParam("unknown", 1);
     TestStream out;
-    EXPECT_EQ(enc.attachOutStream(&out), -1);
+    EXPECT_EQ(enc.attachOutStream(&out), QvStatus::failed);
     EXPECT_STREQ(enc.errorDesc(), "Can  not attach dummy audio, output not a muxer");
     FakeMuxer muxer("dvmux");
     muxer.refused.set("unknown", 1);
@@ -111,7 +116,7 @@ TEST(DummyAudio, HandsParametersAndSamplesToTheMultiplexer) {
     EXPECT_EQ(enc.writePcm(&pcm), 0);
     EXPECT_TRUE(out.data == soundBytes(pcm));
     out.failAfter = 300;
-    EXPECT_EQ(enc.writePcm(&pcm), -1);
+    EXPECT_EQ(enc.writePcm(&pcm), QvStatus::failed);
     EXPECT_EQ(enc.close() + enc.detachOutStream(), 0);
 }
 

@@ -134,7 +134,7 @@ TEST_F(RawVideo, FailureOfTheWorkerReachesTheCaller) {
         EXPECT_EQ(result, -1);
         EXPECT_STREQ(enc().errorDesc(), through ? "Can not write to the output"
                                                 : "Error in raw encoder, can not allocate buffer, size=1024");
-        EXPECT_EQ(enc().close(), -1);
+        EXPECT_EQ(enc().close(), QvStatus::failed);
         EXPECT_EQ(out_.data.size(), 1024u);
         out_.failAfter = SIZE_MAX;
         ASSERT_EQ(enc().open(), 0) << "the failure belongs to the run before";
@@ -148,10 +148,10 @@ TEST_F(RawVideo, RefusesWhatDoesNotFit) {
     format(QvFourcc::I420, 64, 48);
     QvFrame good = makePicture(QvFourcc::I420, 64, 48);
     EXPECT_EQ(enc().writeFrame(&good), QvStatus::illegalState);
-    EXPECT_EQ(enc().open(), -1);
+    EXPECT_EQ(enc().open(), QvStatus::failed);
     EXPECT_STREQ(enc().errorDesc(), "Output stream not attached");
     start();
-    EXPECT_EQ(enc().open(), -1);
+    EXPECT_EQ(enc().open(), QvStatus::failed);
     QvFrame none;
     QvFrame small = makePicture(QvFourcc::I420, 64, 46);
     QvFrame other = makePicture(QvFourcc::I422, 64, 48);

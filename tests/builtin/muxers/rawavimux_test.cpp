@@ -1,3 +1,5 @@
+#include <gmock/gmock.h>
+
 #include <numeric>
 
 #include "core/engine/qvutil.h"
@@ -25,7 +27,7 @@ class AviReader {
     };
 
     explicit AviReader(std::string bytes) : bytes_(std::move(bytes)) {
-        segments();
+        readSegments();
         EXPECT_EQ(declared_, streams.size());
         for (size_t i = 0; i < streams.size(); ++i) readIndex(i);
     }
@@ -39,21 +41,20 @@ class AviReader {
         return joined;
     }
 
-    int riffs = 0;
-    size_t longest = 0;
+    std::vector<size_t> segments;  // their lengths in bytes
     unsigned microseconds = 0, firstFrames = 0, totalFrames = 0, width = 0;
     std::vector<Stream> streams;
     std::vector<Chunk> inOrder;  // of all segments
     std::vector<Chunk> oldIndex;
 
   private:
-    void segments() {
-        for (size_t at = 0; at < bytes_.size(); ++riffs) {
+    void readSegments() {
+        for (size_t at = 0; at < bytes_.size();) {
             ASSERT_EQ(text(at), "RIFF");
-            ASSERT_EQ(text(at + 8), riffs == 0 ? "AVI " : "AVIX");
+            ASSERT_EQ(text(at + 8), segments.empty() ? "AVI " : "AVIX");
             const size_t end = at + 8 + number(at + 4, 4);
             ASSERT_LE(end, bytes_.size());
-            longest = std::max(longest, end - at);
+            segments.push_back(end - at);
             lists(at + 12, end, at);
             at = end;
         }
@@ -219,8 +220,8 @@ TEST_F(RawAvi, SegmentsAndInterleaving) {
     ASSERT_EQ(pipe_->close(), 0);
 
     const auto avi = readAvi();
-    EXPECT_GT(avi.riffs, 10);
-    EXPECT_LE(avi.longest, 20000u + 64 * 16 * 3 + 1000);  // the first holds the headers, too
+    EXPECT_GT(avi.segments.size(), 10u);
+    for (const size_t bytes : avi.segments) EXPECT_LE(bytes, 20000u);
     ASSERT_EQ(avi.streams.size(), 3u);
     const struct {
         const std::string& given;
@@ -251,6 +252,27 @@ TEST_F(RawAvi, SegmentsAndInterleaving) {
         if (chunk.id != "00db") continue;
         EXPECT_NEAR(heard, shown, 0.001);
         shown += 1001.0 / 30000;
+    }
+}
+
+// Pictures of an odd length. What fits to the byte stays together, in the first segment and in a later one.
+TEST_F(RawAvi, ASegmentIsFilledToItsLastByte) {
+    pipe_->getMuxer()->setParam("segments", 4);
+    const auto lengths = [&](int limit) {
+        pipe_->clearStreams();
+        addVideo(QvFourcc::I420, 9, 9);
+        EXPECT_EQ(pipe_->getMuxer()->setParam("riffBytes", limit), 0);
+        EXPECT_EQ(pipe_->open(), 0) << pipe_->errorDesc();
+        for (unsigned i = 0; i < 16; ++i) writePicture(i);
+        EXPECT_EQ(pipe_->close(), 0);
+        return readAvi().segments;
+    };
+    const auto both = lengths(2000);
+    ASSERT_EQ(both.size(), 2u);
+    for (const size_t length : both) {
+        const int limit = static_cast<int>(length);
+        EXPECT_THAT(lengths(limit), testing::Contains(length));
+        EXPECT_THAT(lengths(limit - 1), testing::Each(testing::Lt(length)));
     }
 }
 
@@ -304,6 +326,9 @@ TEST_F(RawAvi, WhatItCanNotHold) {
 TEST_F(RawAvi, OtherWaysOfWriting) {
     addVideo(QvFourcc::v210, 50, 20);
     addAudio(2, 16, 48000);
+    const auto rateOf = [](const QvCodec& codec) { return codec.getParam("estimateSecKb").toDouble(); };
+    EXPECT_EQ(rateOf(*pipe_->audioEncoder(0)), 187.5);
+    EXPECT_EQ(rateOf(*pipe_->getMuxer()), 187.5 + rateOf(*pipe_->videoEncoder(0)));
     ASSERT_EQ(pipe_->open(), 0);
     const std::string data = patternBytes(3 * 128 * 2 * 20);
     auto* out = pipe_->videoStream(0)->bitstream->input();

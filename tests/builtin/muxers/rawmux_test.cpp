@@ -139,7 +139,7 @@ TEST_F(RawMuxing, V210) {
 TEST_F(RawMuxing, FailureToOpenOneClosesAll) {
     streams(1, 2);
     std::filesystem::create_directory(folder_.file("out#01.wav"));
-    EXPECT_EQ(pipe_->open(), -1);
+    EXPECT_EQ(pipe_->open(), QvStatus::failed);
     EXPECT_EQ(pipe_->errorDesc(), "Unable to open output audio file " + folder_.file("out#01.wav"));
     EXPECT_EQ(written(), Texts{"out#00.wav"});
     std::filesystem::remove(folder_.file("out#01.wav"));

@@ -92,7 +92,7 @@ TEST(AudioPipe, TheEndComesAfterTheLastSampleOfTheInput) {
 TEST(AudioPipe, TheReadsFollowTheConvertersRatio) {
     Source decoder(100000, 44100);
     Pipe pipe({"a", "srconvert", "b"});
-    EXPECT_EQ(pipe.open(), -1);
+    EXPECT_EQ(pipe.open(), QvStatus::failed);
     EXPECT_STREQ(pipe.errorDesc(), "invalid samplerates (==0)");
     pipe.converter(1, 44100, 48000);
     ASSERT_EQ(pipe.open(), 0);

@@ -172,6 +172,10 @@ TEST_F(EncodePipeTest, AnalysisWithoutOutput) {
     pipe().clearStreams();
     ASSERT_EQ(pipe().setMuxer("nullmux"), 0);
     EXPECT_STREQ(pipe().sink()->name(), "nullsink");
+    EXPECT_EQ(pipe().setParam("sink/bufsize", 4096), 0);
+    EXPECT_THROW(pipe().setParam("sink/nonsense", 1), QvParamException);
+    EXPECT_EQ(static_cast<const QvCodec&>(*pipe().getMuxer()).getParam("maxStreams"),
+              Any(AnyDict("vids", 99, "auds", 99, "subs", 99, "total", 99)));
     ASSERT_EQ(pipe().addVideoStream("rawvenc") + pipe().addAudioStream("rawaenc"), 0);
     pipe().setParam("video0", AnyDict("type", static_cast<int>(QvFourcc::BGR4), "width", 64, "height", 48));
     QvFrame frame = makePicture(QvFourcc::BGR4, 64, 48);

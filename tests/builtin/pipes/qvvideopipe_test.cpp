@@ -98,10 +98,11 @@ TEST(VideoPipe, PassesTheDecodersErrorOn) {
     FakeDecoder decoder(9, QvFramerate::f25p());
     decoder.failAt = 1;
     Pipe pipe({"a"});
+    EXPECT_EQ(pipe.process(&decoder, 0), QvStatus::failed) << "not open";
     ASSERT_EQ(pipe.open(), 0);
     EXPECT_EQ(pipe.process(&decoder, 0), 0);
     pipe.next();
-    EXPECT_EQ(pipe.process(&decoder, 0), -1);
+    EXPECT_EQ(pipe.process(&decoder, 0), QvStatus::failed);
     decoder.failAt = -1;
     decoder.next = 9;
     EXPECT_EQ(pipe.process(&decoder, 0), QvStatus::endOfStream);
@@ -143,7 +144,7 @@ TEST(VideoPipe, OpeningStopsAtTheFirstFailure) {
     LogCapture log;
     Pipe pipe({"a", "b", "c"});
     pipe.at(1).openResult = -3;
-    EXPECT_EQ(pipe.open(), -3);
+    EXPECT_EQ(pipe.open(), QvStatus::outOfMemory);
     EXPECT_TRUE(log.contains("[video pipe] open error"));
     EXPECT_EQ(pipe.at(0).getState(), 3);
     EXPECT_NE(pipe.at(2).getState(), 3);

@@ -75,7 +75,7 @@ TEST(ChainJobs, CaptionsArriveOnceInOrderAndInTime) {
         CaptionPipe pipe(row.out);
         QvTask task;
         task.setEncoder(&pipe);
-        ASSERT_EQ(task.link(&decoder, 1, 0, 0), 0);
+        ASSERT_EQ(task.link(&decoder, qvVideoStream, 0, 0), 0);
         MetaProcessParams mode;
         mode.setCcMode(true, false, QvCcData::a53, false, false);
         ASSERT_EQ(task.linkMeta(&captions, qvSubpicStream, 0, 1, 0, mode), 0);

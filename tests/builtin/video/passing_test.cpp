@@ -26,11 +26,11 @@ TEST(DumpRaw, AFullDiscIsToldOnceAndFramesPass) {
     QvFrame frame = makePicture(QvFourcc::GRAY, 256, 256);
     EXPECT_EQ(dump.write(frame), 0);
     const LogCapture log;
-    EXPECT_EQ(dump.write(frame), -1);
+    EXPECT_EQ(dump.write(frame), QvStatus::failed);
     EXPECT_EQ(dump.ready(), 1) << "the frame passes";
     EXPECT_EQ(dump.apply(frame), 0) << "it was told once";
     EXPECT_EQ(log.count("fail to write to " + name), 2) << "in both logs";
-    EXPECT_EQ(dump.close(), -1);
+    EXPECT_EQ(dump.close(), QvStatus::failed);
     EXPECT_EQ(dump.open() | dump.close(), 0);
     EXPECT_EQ(TempFolder::read(name), "") << "made anew";
 }

@@ -20,7 +20,7 @@ TEST_F(Base, RefusalsNameTheOperation) {
         std::function<void()> act;
         const char* error;
     } rows[] = {
-        {[&] { decoder.select(1, 1); }, "-1 DecodePipe: invalid stream"},
+        {[&] { decoder.select(qvVideoStream, 1); }, "-1 DecodePipe: invalid stream"},
         {[&] { decoder.nrFrames(1); }, "-1 invalid video stream number 1"},
         {[&] { decoder.close(), decoder.nrFrames(0); }, "-18 nrFrames: illegal state"},
     };

@@ -3,6 +3,7 @@
 #include <cmath>
 #include <limits>
 
+#include "core/engine/status.h"
 #include "core/media/qvbuffer.h"
 #include "tests/support/checks.h"
 
@@ -46,7 +47,7 @@ TEST(AudioStreamReport, RangesAreOfSamplesAndClamped) {
     EXPECT_NEAR(report.peakdB(0, 1600), -6.0206, 1e-4);
     EXPECT_NEAR(report.peakdB(-100000, 1LL << 60), -6.0206, 1e-4);
     EXPECT_EQ(report.peakdB(100000, 200000), -91.0);
-    EXPECT_EQ(report.init(std::numeric_limits<long long>::max(), 2, 48000, 16), -3);
+    EXPECT_EQ(report.init(std::numeric_limits<long long>::max(), 2, 48000, 16), QvStatus::outOfMemory);
 }
 
 }  // namespace

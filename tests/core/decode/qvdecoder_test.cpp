@@ -1,5 +1,6 @@
 #include "core/decode/qvdecoder.h"
 
+#include "core/engine/status.h"
 #include "tests/core/decode/fake_decoder.h"
 #include "tests/support/checks.h"
 
@@ -39,7 +40,7 @@ TEST_F(Contract, SeeksGoToTheFrameAndSampleOfATime) {
     EXPECT_EQ(decoder.seekAll(MediaTime(2.0)), 0);
     EXPECT_EQ(decoder.calls, (std::vector<std::string>{"frame 50 of 0", "sample 96000 of 0"}));
     decoder.seekResult = -4;
-    EXPECT_EQ(decoder.seekAll(MediaTime(2.0)), -1);
+    EXPECT_EQ(decoder.seekAll(MediaTime(2.0)), QvStatus::failed);
 
     EXPECT_EQ(decoder.duration(1, 0).value(), 4 * MediaTime::defaultTimescale);
     EXPECT_EQ(decoder.duration(2, 0).value(), 4000 * (MediaTime::defaultTimescale / 48000));
@@ -55,7 +56,7 @@ TEST_F(Contract, OverridesRememberWhatWasThere) {
     EXPECT_EQ(decoder.override(1, 0, "frameAspect").toDouble(), 1.5);
 
     LogCapture log;
-    EXPECT_EQ(decoder.setOverride(1, 0, "width", 5), -1);
+    EXPECT_EQ(decoder.setOverride(1, 0, "width", 5), QvStatus::failed);
     EXPECT_TRUE(log.contains("[unnamed] Tried to override width -  not allowed", QvLogMask::warning));
 }
 
@@ -64,7 +65,7 @@ TEST_F(Contract, ReportIsMadeOnceFromTheWholeStream) {
     const QvAudioStreamReport* report = decoder.getAudioStreamReport(0);
     ASSERT_TRUE(report);
     EXPECT_TRUE(decoder.selectedWhenRead);
-    EXPECT_FALSE(decoder.isSelected(2, 0)) << "left as it was";
+    EXPECT_FALSE(decoder.isSelected(qvAudioStream, 0)) << "left as it was";
     EXPECT_EQ(report->nrGroups(), 3);
     EXPECT_EQ(report->peak(2), 16384);
     EXPECT_NEAR(report->peakdB(0, 3999), -6.02, 0.01);
@@ -86,7 +87,7 @@ TEST_F(Contract, ReportIsMadeOnceFromTheWholeStream) {
 TEST_F(Contract, NoReportOfAStreamThatFails) {
     decoder.failAtSample = 3000;
     EXPECT_EQ(decoder.getAudioStreamReport(0), nullptr);
-    EXPECT_FALSE(decoder.isSelected(2, 0));
+    EXPECT_FALSE(decoder.isSelected(qvAudioStream, 0));
     decoder.failAtSample = -1;
     decoder.seekResult = -1;
     EXPECT_EQ(decoder.getAudioStreamReport(0), nullptr);

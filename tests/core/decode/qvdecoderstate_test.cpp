@@ -3,6 +3,7 @@
 #include <chrono>
 #include <set>
 
+#include "core/engine/status.h"
 #include "tests/support/checks.h"
 #include "tests/support/wav_bytes.h"
 
@@ -53,7 +54,7 @@ TEST_F(DecoderState, EverythingComesBack) {
     QvDecoderState again;
     ASSERT_EQ(later.restoreState(file, again), 0);
     EXPECT_TRUE(static_cast<const AnyDict&>(again) == state);
-    EXPECT_EQ(later.restoreState("/no/such/file", again), -1);
+    EXPECT_EQ(later.restoreState("/no/such/file", again), QvStatus::failed);
 }
 
 TEST_F(DecoderState, StoringAgainReplacesAndAChangedFileVoidsIt) {
@@ -88,7 +89,7 @@ TEST_F(DecoderState, DamageCountsAsNotStored) {
         ASSERT_EQ(manager.storeState(file, sample()), 0) << c.what;
         c.damage();
         QvDecoderState state;
-        EXPECT_EQ(manager.restoreState(file, state), -1) << c.what;
+        EXPECT_EQ(manager.restoreState(file, state), QvStatus::failed) << c.what;
         EXPECT_TRUE(kept().empty()) << c.what;
     }
 }

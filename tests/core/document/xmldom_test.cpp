@@ -53,6 +53,17 @@ TEST(XmlNode, dataGrowsAndFormats) {
     EXPECT_EQ(node.dataSize(), 2002);  // more room since the data has grown
 }
 
+TEST(XmlNode, namespacesOfOneColonAreStripped) {
+    for (const bool recursive : {false, true}) {
+        XmlNode root("a:b");
+        new XmlNode("e", nullptr, new XmlNode("c:d", nullptr, &root));
+        new XmlNode("f:g:h", nullptr, &root);
+        root.stripXMLNamespace(recursive);
+        const std::string inner = recursive ? "d" : "c:d";
+        EXPECT_EQ(written(root), "<b>\n  <" + inner + ">\n    <e/>\n  </" + inner + ">\n  <f:g:h/>\n</b>\n");
+    }
+}
+
 TEST(XmlNode, writtenForm) {
     XmlNode root("r");
     EXPECT_EQ(written(root), "<r/>\n");

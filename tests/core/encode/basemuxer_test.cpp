@@ -22,21 +22,21 @@ class Muxer : public BaseMuxer {
 TEST(BaseMuxer, KeepsOneListForEachType) {
     {
         Muxer muxer;
-        muxer.addStream(1, AnyDict());
-        auto* v1 = muxer.addStream(1, AnyDict());
-        muxer.addStream(2, AnyDict());
-        muxer.addStream(4, AnyDict());
+        muxer.addStream(qvVideoStream, AnyDict());
+        auto* v1 = muxer.addStream(qvVideoStream, AnyDict());
+        muxer.addStream(qvAudioStream, AnyDict());
+        muxer.addStream(qvSubpicStream, AnyDict());
         for (const auto& [type, count] : {std::pair(0, 4), {255, 4}, {1, 2}, {2, 1}, {4, 1}, {3, 0}, {-1, 0}})
             EXPECT_EQ(muxer.nrStreams(type), count) << type;
-        EXPECT_EQ(muxer.stream(1, 1), v1);
+        EXPECT_EQ(muxer.stream(qvVideoStream, 1), v1);
         muxer.removeStream(1, 0);
-        EXPECT_EQ(muxer.stream(1, 0), v1);
+        EXPECT_EQ(muxer.stream(qvVideoStream, 0), v1);
         muxer.removeStreams(2 | 4);
         EXPECT_EQ(muxer.nrStreams(0), 1);
         EXPECT_EQ(Muxer::Counted::alive, 1);
         muxer.removeStreams(255);
         EXPECT_EQ(Muxer::Counted::alive, 0);
-        muxer.addStream(2, AnyDict());
+        muxer.addStream(qvAudioStream, AnyDict());
     }
     EXPECT_EQ(Muxer::Counted::alive, 0);
 }

@@ -34,8 +34,9 @@ TEST(Util, EffectsSortByPositionAndKeepEqualOnesInOrder) {
     const auto effect = [](const char* name, int position, int front, int on) {
         return Any(AnyDict("name", name, "_position", position, "_front", front, "_on", on));
     };
-    AnyVector in(effect("b2", 2, 0, 1), effect("f1", 1, 1, 1), effect("off", 0, 0, 0), effect("b1", 1, 0, 1),
-                 AnyDict("name", "bare", "_on", 1), effect("b2x", 2, 0, 1), effect("fm", -3, 1, 1), 5);
+    AnyVector in(effect("b2", 2, 0, 1), 5, effect("f1", 1, 1, 1), effect("off", 0, 0, 0),
+                 effect("b1", 1, 0, 1), AnyDict("name", "bare", "_on", 1), effect("b2x", 2, 0, 1),
+                 effect("fm", -3, 1, 1));
     AnyVector front("old"), back("old");
     const auto names = [](const AnyVector& list) {
         AnyVector all;

@@ -83,7 +83,8 @@ TEST_F(ChainLoudness, OnlyTheRangeCounts) {
     const struct {
         long long from, to;
         int peak;
-    } rows[] = {{0, 400, 400}, {1200, 1300, 300}, {95990, 200000, 1000}, {900, 2100, 1000}, {1000, 1002, 2}};
+    } rows[] = {{0, 400, 400},     {1200, 1300, 300}, {95990, 200000, 1000},
+                {900, 2100, 1000}, {1000, 1002, 2},   {0, 8202, 1000}};
     for (const auto& [from, to, peak] : rows) {
         first.report.clear();
         apply(from, to);

@@ -1,5 +1,6 @@
 #include "core/filter/qvfilter.h"
 
+#include "core/engine/status.h"
 #include "tests/support/checks.h"
 #include "tests/support/fake_filters.h"
 
@@ -54,7 +55,7 @@ TYPED_TEST(FilterContract, CommonParametersAndState) {
     EXPECT_EQ(other.getParam("_front"), Any(4));
     for (const auto& name : {Any("other"), Any(5), Any()}) {
         state.set("name", name);
-        EXPECT_EQ(other.restore(state), -1);
+        EXPECT_EQ(other.restore(state), QvStatus::failed);
     }
     EXPECT_TRUE(log.contains("Invalid state dict, module name is other"));
 }

@@ -5,6 +5,7 @@
 
 #include <cstdio>
 
+#include "core/engine/status.h"
 #include "core/media/qvframe.h"
 #include "tests/core/media/frame_model.h"
 #include "tests/support/checks.h"
@@ -123,14 +124,14 @@ TEST(QvImageSave, FailuresLeaveNothing) {
     const TempFolder folder;
     QvFrame frame = noiseFrame(BGR3, 300, 200, 0, 1);
     for (int format : {QvImage::bmp, QvImage::png}) {
-        EXPECT_EQ(QvImage::saveFrame(frame, narrow(folder.file("no/folder")), format), -1);
-        EXPECT_EQ(QvImage::saveFrame(frame, Any("/dev/full"), format), -1);
+        EXPECT_EQ(QvImage::saveFrame(frame, narrow(folder.file("no/folder")), format), QvStatus::failed);
+        EXPECT_EQ(QvImage::saveFrame(frame, Any("/dev/full"), format), QvStatus::failed);
         EXPECT_TRUE(std::filesystem::exists("/dev/full"));
     }
     // Without the module that converts nothing is opened; a picture without pixels is no PNG.
     const std::string name = folder.file("none.png");
     for (const QvFrame& none : {noiseFrame(YUY2, 8, 8, 0, 1), noiseFrame(BGR3, 0, 0, 0, 1)}) {
-        EXPECT_EQ(QvImage::saveFrame(none, narrow(name), QvImage::png), -1);
+        EXPECT_EQ(QvImage::saveFrame(none, narrow(name), QvImage::png), QvStatus::failed);
         EXPECT_FALSE(std::filesystem::exists(name));
     }
 }

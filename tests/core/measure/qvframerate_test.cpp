@@ -15,6 +15,29 @@ TEST(QvFramerate, ReducesAndComparesByTolerance) {
     EXPECT_FALSE(QvFramerate::f24p().isPAL());
 }
 
+TEST(QvFramerate, IsFoundByItsKind) {
+    const auto film = [](int pulldown) { return QvFramerate(QvRatio(24000, 1001), 0, false, pulldown); };
+    const QvFramerate drop(29.97, 0, true);
+    const AnyVector rates(24, film(1), film(3), QvFramerate::f29p(), drop);
+    const struct {
+        QvFramerate rate;
+        bool exact, compareDf;
+        int found;
+    } rows[] = {
+        {film(2), false, true, 1},
+        {film(2), true, true, -1},
+        {film(3), false, true, 2},
+        {film(3), true, true, 2},
+        {film(0), false, true, -1},
+        {drop, false, true, 4},
+        {drop, false, false, 3},
+        {QvFramerate(29.97, 1), false, false, -1},
+        {QvFramerate(25.0), false, false, -1},
+    };
+    for (const auto& row : rows)
+        EXPECT_EQ(row.rate.findInVector(rates, row.exact, row.compareDf), row.found) << &row - rows;
+}
+
 TEST(QvFramerate, DominanceAndDisplayRate) {
     const QvRatio film(24000, 1001), ntsc(30000, 1001), twice(48000, 1001);
     for (const auto& [pulldown, display] : {std::pair{0, film}, {1, ntsc}, {3, ntsc}, {4, twice}, {5, film}})

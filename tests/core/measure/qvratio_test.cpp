@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include "core/measure/qvnum.h"
+
 namespace {
 
 TEST(QvRatio, FindsTheRatioOfADouble) {
@@ -21,6 +23,12 @@ TEST(QvRatio, FindsTheRatioOfADouble) {
         QvRatio ratio;
         EXPECT_EQ(ratio.fromDouble(c.value, c.maxDen), c.status) << c.value;
         EXPECT_EQ(ratio, c.ratio) << c.value;
+    }
+    // A negative value is truncated towards 0 and never rounded away from it.
+    for (const auto& [value, status] : {std::pair{2.9997, 0}, {-2.9997, -1}, {-3.0003, 0}}) {
+        int num = 0, den = 0;
+        EXPECT_EQ(QvNum::ratio(value, num, den, 100, 0.001), status) << value;
+        EXPECT_EQ(num, status ? -1 : value < 0 ? -3 : 3);
     }
 }
 

@@ -55,6 +55,12 @@ TEST(QvColor, ConvertsBothWays) {
         {{0, 0, 0, true}, false, 0x008700},       {{255, 255, 255, true}, true, 0xffacff},
     };
     for (const auto& c : toRgb) EXPECT_EQ(c.in.bgr32(c.hd), c.out) << std::hex << c.in.bgr32(c.hd);
+    for (const auto& [luma, limited, level] :
+         {std::tuple{255, true, 235}, {0, true, 16}, {255, false, 255}, {0, false, 0}}) {
+        unsigned char r = 1, g = 1, b = 1;
+        QvColor::yuv2rgb(static_cast<unsigned char>(luma), 128, 128, &r, &g, &b, true, limited);
+        EXPECT_TRUE(r == level && g == level && b == level) << luma << " " << limited;
+    }
 }
 
 TEST(QvDraw, FillsRectangles) {

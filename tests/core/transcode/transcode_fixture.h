@@ -127,8 +127,8 @@ struct Job {
         if (linked) linkBoth();
     }
     void linkBoth() {
-        ASSERT_EQ(task.link(&decoder, 1, 0, 0), 0);
-        ASSERT_EQ(task.link(&decoder, 2, 0, 0), 1);
+        ASSERT_EQ(task.link(&decoder, qvVideoStream, 0, 0), 0);
+        ASSERT_EQ(task.link(&decoder, qvAudioStream, 0, 0), 1);
     }
 
     Events events;

@@ -16,6 +16,20 @@ TEST(AString, inlineTextIsCutPaddedAndIndependent) {
     EXPECT_STREQ(AString<4>(nullptr).c_str(), "");
 }
 
+TEST(AString, textWithoutRoomOfItsOwnIsACopyOrAnAlias) {
+    const char source[] = "abc";
+    for (const int owned : {0, 1}) {
+        char* text = nullptr;
+        int flag = -1;
+        AS_construct(source, owned, 0, nullptr, &text, &flag);
+        EXPECT_EQ(flag, owned);
+        EXPECT_EQ(text == source, !owned);
+        AS_assign(nullptr, &text, flag, 0, text + 1);
+        EXPECT_STREQ(text, "bc");
+        AS_destroy(text, flag, 0);
+    }
+}
+
 TEST(AString, comparesUnsignedBytes) {
     EXPECT_EQ(AS_compare("a", "a"), 0);
     EXPECT_EQ(AS_compare("a", "ab"), -1);

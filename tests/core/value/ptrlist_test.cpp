@@ -8,6 +8,7 @@ TEST(PtrList, positionsOutsideTheRange) {
     int a = 1;
     TPtrList<int> list;
     EXPECT_EQ(failureOf([&] { list.back(); }), "");
+    EXPECT_EQ(list.indexOf(&a), -1);
     for (int i = 0; i < 2; ++i, list.insert(0, &a)) {
         for (int outside : {-1, 1, 99}) {
             EXPECT_EQ(failureOf([&] { list.at(outside); }), "") << outside;

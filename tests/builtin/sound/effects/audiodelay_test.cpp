@@ -49,7 +49,7 @@ TEST(QvADelay, OpenedAgainItStartsWithSilence) {
     EXPECT_EQ(delay.open(), 0);
     EXPECT_EQ(throughFilter(delay, in, 1, {100}), first);
     QvPcm other = soundOf(in, 2);
-    ASSERT_EQ(delay.write(other), -1) << "the ring is of the first format";
+    ASSERT_EQ(delay.write(other), QvStatus::failed) << "the ring is of the first format";
 }
 
 TEST(QvADelay, StoresItsDelay) {

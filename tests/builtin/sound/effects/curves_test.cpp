@@ -176,6 +176,14 @@ void refusesBadLists(const char* name, const AnyDict& good) {
     EXPECT_EQ(filter.getParam(name), Any(AnyVector()));
 }
 
+TEST(CurveFilters, AnOutputKeepsItsFormat) {
+    QvPcm stereo = soundOf({1, 2}, 2), mono = soundOf({1, 2}, 1);
+    OpenedSound<CustomAudioVolume> level;
+    ASSERT_EQ(level.write(stereo), 0);
+    EXPECT_EQ(level.write(mono), QvStatus::failed);
+    EXPECT_EQ(level.samples(), 1);
+}
+
 TEST(CurveFilters, BadListsAreRefused) {
     refusesBadLists<CustomAudioVolume>("volume_list_7", AnyDict("time", 1.5, "volume", 30));
     refusesBadLists<CAudioPanning>("panning_list_0", AnyDict("time", 1.5, "volume", 30, "out_ch", 7));
@@ -192,6 +200,9 @@ TEST(CurveFilters, ListsAreStoredSortedAndDescribed) {
     other.init();
     EXPECT_EQ(other.restore(state), 0);
     EXPECT_EQ(other.getParam("panning_list_2"), Any(sorted));
+    other.init();
+    EXPECT_EQ(other.restore(AnyDict("name", other.name(), "panning_list_5", sorted)), 0);
+    EXPECT_EQ(other.getParam("panning_list_5"), Any(sorted)) << "a state need not have them all";
     const LogCapture log;
     state.set("panning_list_1", 5);
     EXPECT_EQ(other.restore(state), QvStatus::invalidParam);

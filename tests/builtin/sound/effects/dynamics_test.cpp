@@ -131,29 +131,29 @@ TEST(Dynamics, AnyParametersGiveSamples) {
 
 TEST(Dynamics, StatesAndRefusals) {
     Dynamics filter;
-    EXPECT_EQ(filter.open(), -1);
+    EXPECT_EQ(filter.open(), QvStatus::failed);
     EXPECT_EQ(filter.init(), 0);
-    EXPECT_EQ(filter.init(), -1);
+    EXPECT_EQ(filter.init(), QvStatus::failed);
     QvPcm pcm = soundOf({1, 2}, 2);
-    EXPECT_EQ(filter.write(pcm), -1);
+    EXPECT_EQ(filter.write(pcm), QvStatus::failed);
     EXPECT_EQ(filter.open(), 0);
-    EXPECT_EQ(filter.open(), -1);
+    EXPECT_EQ(filter.open(), QvStatus::failed);
     EXPECT_EQ(filter.write(pcm), 0);
     EXPECT_EQ(filter.close(), 0);
     EXPECT_EQ(filter.samples(), 1) << "what waits stays";
     filter.setParam("_channels", 9);
-    EXPECT_EQ(filter.open(), -1);
+    EXPECT_EQ(filter.open(), QvStatus::failed);
     EXPECT_STREQ(filter.errorDesc(), "dynamics works on up to 8 channels, the sound has 9");
     filter.setParam("_channels", 8);
     EXPECT_EQ(filter.open(), 0);
     filter.erase(1);
     pcm = soundOf(Values(9, 1), 9);
-    EXPECT_EQ(filter.write(pcm), -1);
+    EXPECT_EQ(filter.write(pcm), QvStatus::failed);
     EXPECT_STREQ(filter.errorDesc(), "dynamics works on up to 8 channels, the sound has 9");
     pcm.init(1, 2, 2, 48000);
-    EXPECT_EQ(filter.write(pcm), -1);
+    EXPECT_EQ(filter.write(pcm), QvStatus::failed);
     pcm.init(1, 2, 4, 0);
-    EXPECT_EQ(filter.write(pcm), -1);
+    EXPECT_EQ(filter.write(pcm), QvStatus::failed);
     for (const auto& [name, value] : {std::pair{"limiterLevel", Any(std::nan(""))},
                                       {"expanderRatio", Any(0)},
                                       {"noisegateAttack", Any(-1.0)},

@@ -190,7 +190,7 @@ TEST(NormalizedChain, AStopEndsTheMeasurement) {
         FiltersState filters;
         filters.appendFilter("normalizer", AnyDict("name", "normalizer", "_on", 1));
         params.setFilters(filters);
-        ASSERT_GE(task.link(&decoder, 2, 0, 0, params), 0) << task.errorDesc();
+        ASSERT_GE(task.link(&decoder, qvAudioStream, 0, 0, params), 0) << task.errorDesc();
         Measured run(&task);
         run.setParam("startDelay", 0);
         run.stopAt = stopAt;

@@ -164,7 +164,8 @@ TEST(Aquant, RefusesOtherWidths) {
     EXPECT_THROW(filter.write(pcm), QvAssertFailure);
     filter.setParam("outBitsPerSample", 16);
     ASSERT_EQ(filter.write(pcm), 0);
-    EXPECT_EQ(filter.write(mono), QvStatus::failed) << "the output has two channels";
+    EXPECT_EQ(filter.write(mono), QvStatus::failed);
+    EXPECT_STREQ(filter.errorDesc(), "the format of the sound changed from 2 channels of 16 bits to 1 of 16");
     EXPECT_EQ(filter.samples(), 5);
 }
 

@@ -225,6 +225,12 @@ TEST(Srconvert, ABatchOfZeroTakesTheWholeBuffer) {
     const auto made = out.size() / 8;
     EXPECT_EQ(made, 1089u);  // the last one lies at 1088 * 44100 / 96000 = 499.8
     EXPECT_TRUE(valuesOf(out) == modelled(in, 2, 44100, 96000, made));
+
+    // A sound that does not know its rate gets room as one of 48 kHz does.
+    Opened other{{"inSamplerate", 44100}, {"outSamplerate", 96000}, {"splsToGet", 0}};
+    QvPcm unknown = pcmOf(bytesOf(in), 2, 4, 0);
+    ASSERT_EQ(other.write(unknown), 0);
+    EXPECT_EQ(other.pcm()->size(), static_cast<int>(96000 / 48000.0 * 1.02 * 500));
 }
 
 TEST(Srconvert, EqualRatesCopyAnyWidth) {

@@ -44,7 +44,7 @@ TEST(QvDeinterlace, EachMethodTakesItsRows) {
         for (const Any& method : row.method) {
             EXPECT_EQ(filter.setParam("deinterlace", method), 0);
             EXPECT_EQ(filter.getParam("deinterlace"), Any(row.name));
-            EXPECT_EQ(filter.write(in), -18) << "before open";
+            EXPECT_EQ(filter.write(in), QvStatus::illegalState) << "before open";
             ASSERT_EQ(filter.open(), 0);
             ASSERT_EQ(filter.write(in), 0);
             ASSERT_EQ(filter.ready(), 1);
@@ -55,7 +55,7 @@ TEST(QvDeinterlace, EachMethodTakesItsRows) {
             EXPECT_EQ(out.getTimestamp(), 99);
             filter.next();
             EXPECT_EQ(filter.ready(), 0);
-            EXPECT_EQ(filter.write(empty), -12);
+            EXPECT_EQ(filter.write(empty), QvStatus::invalidArgument);
             filter.close();
         }
 }

@@ -4,6 +4,7 @@
 #include <sstream>
 
 #include "core/caption/cc/qvcc.h"
+#include "core/engine/status.h"
 #include "tests/support/checks.h"
 
 namespace {
@@ -149,7 +150,7 @@ TEST(QvFramerateConvert, BrokenContractsAreAssertions) {
         EXPECT_THROW(Converter(in, out).open(), QvAssertFailure) << in << " " << out;
     Converter converter(50, 25);
     const auto write = [&](int number, double rate = 50) { return converter.put(Input("A", number, rate)); };
-    EXPECT_EQ(write(10), -18);
+    EXPECT_EQ(write(10), QvStatus::illegalState);
     converter.open();
     EXPECT_THROW(converter.open(), QvAssertFailure);
     EXPECT_THROW(write(11, 25), QvAssertFailure);
@@ -159,12 +160,12 @@ TEST(QvFramerateConvert, BrokenContractsAreAssertions) {
     EXPECT_EQ(write(11), 0);
     EXPECT_THROW(write(13), QvAssertFailure);
     QvFrame empty;
-    EXPECT_EQ(converter.write(empty), -12);
+    EXPECT_EQ(converter.write(empty), QvStatus::invalidArgument);
 }
 
 TEST(QvFramerateConvert, StateAndPlaceInAChain) {
     Converter converter(25, 12.5, 2, 1), other(24, 24);
-    EXPECT_EQ(converter.setParam("interlace", 3), -5);
+    EXPECT_EQ(converter.setParam("interlace", 3), QvStatus::invalidParam);
     AnyDict stored;
     converter.store(stored);
     EXPECT_EQ(other.restore(stored), 0);

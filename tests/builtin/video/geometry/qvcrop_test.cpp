@@ -91,7 +91,7 @@ TEST(QvCrop, LimitsAreToldAndHeld) {
         for (std::size_t i = 0; i < 4; ++i) {
             EXPECT_EQ(crop.number(names[i]), limits[i]) << names[i];
             const int beyond = limits[i] + (i % 2 ? 4 : -4);
-            EXPECT_EQ(crop.setParam(i < 2 ? "cropWidth" : "cropHeight", beyond), -1) << beyond;
+            EXPECT_EQ(crop.setParam(i < 2 ? "cropWidth" : "cropHeight", beyond), QvStatus::failed) << beyond;
         }
     }
 }
@@ -120,7 +120,7 @@ TEST(QvCrop, WhatItRefusesChangesNothing) {
         Cropper crop({{"mode", row.mode}});
         AnyDict before, after;
         crop.store(before);
-        EXPECT_EQ(crop.setParam(row.name, row.value), -1) << row.name;
+        EXPECT_EQ(crop.setParam(row.name, row.value), QvStatus::failed) << row.name;
         EXPECT_NE(std::string(crop.errorDesc()).find(row.text), std::string::npos) << crop.errorDesc();
         crop.store(after);
         EXPECT_EQ(Any(before), Any(after)) << row.name;
@@ -191,7 +191,7 @@ TEST(QvCrop, FramesOfOtherSizesAndFieldOrders) {
     // A box that the frames do not have, and what can't be cut.
     Opened box({{"mode", 1}, {"cropBox", QvRect(0, 0, 161, 50)}});
     EXPECT_EQ(box.through(large).width(), 161);
-    EXPECT_EQ(box.write(hundred), -1);
+    EXPECT_EQ(box.write(hundred), QvStatus::failed);
     EXPECT_EQ(box.ready(), 0);
     EXPECT_NE(std::string(box.errorDesc()).find("(0, 0)-(161, 50) does not lie in the frame of 160x100"),
               std::string::npos);
@@ -199,5 +199,5 @@ TEST(QvCrop, FramesOfOtherSizesAndFieldOrders) {
     EXPECT_NE(box.write(tens), 0);
     Opened huge(
         {{"mode", 1}, {"padLeft", 16384}, {"padRight", 16384}, {"padTop", 16384}, {"padBottom", 16384}});
-    EXPECT_EQ(huge.write(large), -3);
+    EXPECT_EQ(huge.write(large), QvStatus::outOfMemory);
 }

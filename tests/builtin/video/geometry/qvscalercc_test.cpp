@@ -5,6 +5,7 @@
 #include <cstring>
 #include <vector>
 
+#include "core/engine/status.h"
 #include "core/filter/qvcolorconvert.h"
 #include "core/measure/qvframerate.h"
 #include "tests/support/checks.h"
@@ -54,7 +55,7 @@ TEST(QvScalerCC, ParametersAreKeptStoredAndRestored) {
     EXPECT_EQ(other.getParam("FOURCC"), Any("BGR3"));
     for (value = 2; const char* name : names) EXPECT_EQ(other.getParam(name), Any(value++)) << name;
     stored.set("name", "flipper");
-    EXPECT_EQ(other.restore(stored), -1);
+    EXPECT_EQ(other.restore(stored), QvStatus::failed);
 }
 
 TEST(QvScalerCC, AnyFourccIsRestoredAlsoNone) {
@@ -79,7 +80,7 @@ TEST(QvScalerCC, OutputsThatCanNotBeMadeFailToOpen) {
         scaler.setParam("FOURCC", fourcc);
         scaler.setParam("outWidth", w);
         scaler.setParam("outHeight", h);
-        EXPECT_EQ(scaler.open(), -1) << fourcc;
+        EXPECT_EQ(scaler.open(), QvStatus::failed) << fourcc;
         EXPECT_STREQ(scaler.errorDesc(), "QvScalerCC::Can not init output frame!");
         QvFrame frame = plain(QvFourcc::I420, 8, 8, 1);
         EXPECT_NE(scaler.write(frame), 0);

@@ -161,12 +161,12 @@ TEST_F(Logos, FilesThatAreNoLogo) {
         QvLogo logo;
         logo.init();
         logo.setParam("filename", name.c_str());
-        EXPECT_EQ(logo.open(), -1) << name;
+        EXPECT_EQ(logo.open(), QvStatus::failed) << name;
         EXPECT_NE(std::string(logo.errorDesc()).find("logo picture"), std::string::npos) << logo.errorDesc();
         AnimatedLogo animated;
         animated.init();
         animated.setParam("filename", name.c_str());
-        EXPECT_EQ(animated.open(), -1) << name;
+        EXPECT_EQ(animated.open(), QvStatus::failed) << name;
         EXPECT_NE(std::string(animated.errorDesc()).find("movie"), std::string::npos) << animated.errorDesc();
     }
 }

@@ -108,7 +108,7 @@ TEST_F(Timecode, WriteDrawsOntoACopyAndTakesNoMemoryForAStillText) {
         for (int i = 0; i < 5; ++i) writer.apply(given);
         EXPECT_EQ(allocations, before);
         QvFrame nothing;
-        EXPECT_EQ(writer.apply(nothing), -12);
+        EXPECT_EQ(writer.apply(nothing), QvStatus::invalidArgument);
     }
 }
 

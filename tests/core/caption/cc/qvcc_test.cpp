@@ -1,6 +1,7 @@
 #include "core/caption/cc/qvcc.h"
 
 #include "core/caption/cc/cctext.h"
+#include "core/engine/status.h"
 #include "tests/support/checks.h"
 
 namespace {
@@ -52,7 +53,7 @@ TEST(QvCcData, StoredFormReadsBackOrIsRefusedWhole) {
     other.set("name", "text");
     broken["data"].asVector().append(1);
     for (const AnyDict& bad : {AnyDict(), other, broken, AnyDict("name", "cc_data", "data", 3)})
-        EXPECT_EQ(back.restore(bad), -1);
+        EXPECT_EQ(back.restore(bad), QvStatus::failed);
     EXPECT_EQ(back, data);
 }
 
@@ -72,12 +73,13 @@ TEST(QvCcData, BuffersOfEachFormat) {
         const int size = static_cast<int>(row.bytes.size());
         EXPECT_EQ(data.byteSize(row.fmt), size);
         buffer.assign(104, 'x');
-        EXPECT_EQ(data.toBuffer(row.fmt, size - 1, bytes), -18);
+        EXPECT_EQ(data.toBuffer(row.fmt, size - 1, bytes), QvStatus::illegalState);
         EXPECT_EQ(data.toBuffer(row.fmt, 104, bytes), size);
         EXPECT_EQ(buffer, row.bytes + std::string(buffer.size() - row.bytes.size(), 'x'));
         EXPECT_EQ(QvCcData::detectBufferFmt(size, bytes), row.fmt == 0 ? -1 : row.fmt);
         for (int cut = 0; cut < size - (row.fmt ? 1 : 0); ++cut)  // the last marker is not needed
-            EXPECT_EQ(back.fromBuffer(row.fmt, cut, bytes, &t), -18) << row.fmt << " " << cut;
+            EXPECT_EQ(back.fromBuffer(row.fmt, cut, bytes, &t), QvStatus::illegalState)
+                << row.fmt << " " << cut;
         ASSERT_EQ(back.fromBuffer(row.fmt, size, bytes, &t), 0);
         EXPECT_EQ(hex(back), "fc9420 fa0000");
         EXPECT_EQ(back.at(1).time, t);
@@ -87,8 +89,8 @@ TEST(QvCcData, BuffersOfEachFormat) {
     EXPECT_EQ(data.fromBuffer(5, 104, bytes, nullptr), 0);
     EXPECT_EQ(data.count(), 31);
     data.appendFillers(1, 2, false, MediaTime());
-    EXPECT_EQ(data.toBuffer(5, 104, bytes), -18);
-    EXPECT_EQ(data.fromBuffer(0, 96, bytes, nullptr), -18);
+    EXPECT_EQ(data.toBuffer(5, 104, bytes), QvStatus::illegalState);
+    EXPECT_EQ(data.fromBuffer(0, 96, bytes, nullptr), QvStatus::illegalState);
 }
 
 // The 608 slots of four frames, then the number of slots, for every rate.

@@ -1,5 +1,6 @@
 // SCC files, read and written.
 #include "core/caption/cc/qvcc.h"
+#include "core/engine/status.h"
 #include "tests/support/checks.h"
 
 namespace {
@@ -51,7 +52,7 @@ TEST_F(Scc, KeepsLinesWithATimecodeAndWords) {
     EXPECT_EQ(data.count(), 1600);
     // What is no SCC file keeps the list.
     for (const char* bytes : {"", "Scenarist_SC", "\nScenarist_SCC V1.0\n", "scenarist_scc V1.0\n"})
-        EXPECT_EQ(readFile(folder.write("b.scc", bytes)), -15) << bytes;
+        EXPECT_EQ(readFile(folder.write("b.scc", bytes)), QvStatus::noSegment) << bytes;
     EXPECT_EQ(data.count(), 1600);
     EXPECT_EQ(readFile(folder.write("b.scc", "Scenarist_SCC")), 0);
     EXPECT_EQ(data.count(), 0);
@@ -65,7 +66,7 @@ TEST_F(Scc, FilesAsTheyAreFound) {
     ASSERT_EQ(readFile(folder.write("a.scc", mark + macintosh), true), 0);
     EXPECT_EQ(words(), "9420 942f 94ae");
     EXPECT_FALSE(log.contains("line"));
-    EXPECT_EQ(readFile(folder.write("a.scc", mark + head)), -15);
+    EXPECT_EQ(readFile(folder.write("a.scc", mark + head)), QvStatus::noSegment);
 
     const std::string damaged =
         head + "\r\n\r\n00:00:01:02\t9420 94x0 942f\r\n\r\n00:00:0s 9420\r\n1:2:3:4 94208";

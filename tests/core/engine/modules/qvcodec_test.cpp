@@ -5,6 +5,7 @@
 #include "core/engine/modules/init.h"
 #include "core/engine/modules/qvmodule.h"
 #include "core/engine/modules/qvregistry.h"
+#include "core/engine/status.h"
 #include "tests/support/checks.h"
 
 namespace {
@@ -75,7 +76,7 @@ TEST(Codec, UnknownParameterThrowsOrIsAStatus) {
     EXPECT_EQ(failureOf([&] { codec.setParam("x", 1); }), text);
     EXPECT_TRUE(log.contains("Exception: " + text, QvLogMask::debug));
     qv_registry()->setConfig(AnyDict("disable_exceptions", 1));
-    EXPECT_EQ(codec.setParam("x", 1), -5);
+    EXPECT_EQ(codec.setParam("x", 1), QvStatus::invalidParam);
     EXPECT_EQ(codec.setParamDict(AnyDict("fail", 2, "unknown", 1)), 2 | -5);
     qv_registry()->setConfig(AnyDict());
     EXPECT_THROW(codec._raiseInvalidParam("x"), QvParamException);
@@ -99,7 +100,7 @@ TEST(Codec, StateGoesOutAndIn) {
     EXPECT_EQ(codec->restore(state), 0);
     for (const AnyDict& foreign : {AnyDict(), AnyDict("name", "other"), AnyDict("name", 1)}) {
         codec->init();
-        EXPECT_EQ(codec->restore(foreign), -1);
+        EXPECT_EQ(codec->restore(foreign), QvStatus::failed);
         EXPECT_STREQ(codec->errorDesc(), "restore - invalid name");
     }
 }

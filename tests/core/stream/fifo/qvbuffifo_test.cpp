@@ -5,6 +5,7 @@
 #include <deque>
 #include <random>
 
+#include "core/engine/status.h"
 #include "tests/core/stream/streamtools.h"
 
 namespace {
@@ -23,8 +24,9 @@ struct Ring : testing::Test {
 };
 
 // Any order of the four ways in and out against a queue. Writers keep one byte free, as they must.
+template <class Fifo = QvBufStreamFifo>
 void driveAgainstModel(unsigned size, unsigned chunk, int steps, unsigned seed) {
-    QvBufStreamFifo fifo;
+    Fifo fifo;
     ASSERT_EQ(fifo.init(ring(static_cast<int>(size), static_cast<int>(chunk))), 0);
     bufstream *const in = fifo.input(), *const out = fifo.output();
     std::deque<unsigned char> model;
@@ -78,6 +80,15 @@ TEST(QvBufStreamFifo, IsAQueueWhateverTheOrderOfOperations) {
     driveAgainstModel(1000, 11, 200'000, 3);
     driveAgainstModel(256, 129, 150'000, 4);
     driveAgainstModel(3, 2, 50'000, 5);
+    driveAgainstModel<QvBufFifoDbg>(61, 17, 2000, 6);
+}
+
+TEST_F(Ring, ANewSizeThrowsAwayWhatIsIn) {
+    put(in, "abc");
+    ASSERT_EQ(fifo.resize(40, 11), 0);
+    EXPECT_EQ(usable(fifo.output()), 0u);
+    EXPECT_EQ(usable(fifo.input()), 40u);
+    EXPECT_EQ(copyIn(fifo.input(), patternBytes(40)), 40u);
 }
 
 TEST(QvBufStreamFifo, SizesThatMakeNoRingAreAsserted) {
@@ -146,6 +157,19 @@ TEST(QvBufStreamFifo, FlushThrowsAwayAndObserversHearInOrder) {
     bufstream* in = fifo.input();
     EXPECT_EQ(tell(in, QvAuxId::SAMPLE_INFO, 1, 7), 0u);
     EXPECT_THAT(heard, testing::ElementsAre("1 SAMPLE_INFO/7/4", "2 SAMPLE_INFO/7/4"));
+    EXPECT_STREQ(qvAuxInfoName(5), "?");
+    heard.clear();
+    struct Leaving : QvAuxInfoObserver {
+        explicit Leaving(QvBufStream& from) : from_(from) {}
+        void auxInfo(unsigned, unsigned, void*, unsigned) override { from_.unregisterObserver(this); }
+        QvBufStream& from_;
+    } leaving(fifo);
+    EXPECT_EQ(fifo.unregisterObserver(&second), 0);
+    fifo.registerObserver(&leaving);
+    fifo.registerObserver(&second);
+    tell(in, QvAuxId::SAMPLE_INFO);
+    EXPECT_EQ(heard.size(), 2u) << "the one after the one that left hears as well";
+    EXPECT_EQ(fifo.unregisterObserver(&leaving), QvStatus::failed);
     EXPECT_EQ(fifo.unregisterObserver(&first), 0);
     EXPECT_EQ(fifo.unregisterAllObservers(), 0);
     tell(in, QvAuxId::SAMPLE_INFO);
@@ -160,13 +184,33 @@ class Draining : public QvBufStreamFifoCb {
   public:
     void cbProgress(int bytes) override {
         calls.push_back(bytes);
-        if (drain) text += copyOut(output(), static_cast<unsigned>(bytes));
+        if (refusing) throw 5;
+        text += copyOut(output(), static_cast<unsigned>(bytes));
     }
 
     std::vector<int> calls;
     std::string text;
-    bool drain = true;
+    bool refusing = false;
 };
+
+// What the consumer did not take stays in the ring; it is called again for new bytes, not for those that it
+// refused.
+TEST(QvBufStreamFifoCb, AConsumerThatThrowsIsNotCalledAgainForTheSameBytes) {
+    Draining fifo;
+    ASSERT_EQ(fifo.init(AnyDict("size", 100, "chunk", 21, "callback", 10)), 0);
+    bufstream* in = fifo.input();
+    fifo.refusing = true;
+    EXPECT_THROW(put(in, "0123456789"), int);
+    EXPECT_THROW(copyIn(in, "abcdefghijkl"), int);
+    fifo.refusing = false;
+    EXPECT_TRUE(put(in, "ABCDE"));
+    EXPECT_EQ(copyIn(in, "FGHI"), 4u);
+    EXPECT_THAT(fifo.calls, testing::ElementsAre(10, 12));
+    EXPECT_TRUE(put(in, "J"));
+    EXPECT_THAT(fifo.calls, testing::ElementsAre(10, 12, 10));
+    EXPECT_EQ(fifo.text, "0123456789");
+    EXPECT_EQ(copyOut(fifo.output(), 20), "abcdefghijklABCDEFGH");
+}
 
 TEST(QvBufStreamFifoCb, CallsAtTheThresholdAndStopsOnWish) {
     Draining fifo;

@@ -1,5 +1,7 @@
 #include "core/stream/file/qvfilebufstream.h"
 
+#include "core/engine/status.h"
+#include "core/stream/iofailure.h"
 #include "tests/core/stream/streamtools.h"
 #include "tests/support/failing_memory.h"
 
@@ -35,6 +37,33 @@ TEST_F(FileStream, WritesBlocksAndBytesInOrder) {
     EXPECT_EQ(bytes(), expected);
 }
 
+TEST(QvNullBufStream, TakesAndCountsWhatNobodyKeeps) {
+    QvNullBufStream stream;
+    EXPECT_THROW(stream.init(AnyDict("size", -1)), QvAssertFailure);
+    EXPECT_EQ(stream.init(AnyDict("size", 0)), 0);
+    ASSERT_EQ(stream.init(AnyDict("size", 64)), 0);
+    bufstream* in = stream.input();
+    EXPECT_EQ(usable(in), 64u);
+    EXPECT_TRUE(put(in, patternBytes(64)));
+    EXPECT_FALSE(in->request(in, 65));
+    EXPECT_EQ(copyIn(in, patternBytes(1000)), 1000u);
+    EXPECT_EQ(ask<uint64_t>(in, BYTECOUNT_INFO), 1064u);
+}
+
+TEST(QvIoFailure, TheFirstOneStaysAndIsLoggedOnce) {
+    QvIoFailure failure;
+    const LogCapture log;
+    failure.report(0, "First", qv_wide_name("a"));
+    failure.report(ENOSPC, "Second", qv_wide_name("b"));
+    EXPECT_EQ(failure.code(), EIO) << "an error without a number";
+    EXPECT_TRUE(failure.text().starts_with("First 'a': "));
+    EXPECT_EQ(log.count("", QvLogMask::error), 1);
+    failure.clear();
+    failure.report(ECANCELED, "Third", qv_wide_name("c"));
+    EXPECT_EQ(failure.code(), ECANCELED);
+    EXPECT_EQ(log.count("", QvLogMask::error), 1) << "the user asked for it";
+}
+
 TEST_F(FileStream, AFullBufferLeavesRoom) {
     bufstream* in = begin();
     ASSERT_TRUE(put(in, patternBytes(60)));
@@ -47,15 +76,15 @@ TEST_F(FileStream, AFullBufferLeavesRoom) {
 TEST_F(FileStream, WhatCanNotBeOpened) {
     for (const std::string& bad : {folder.file("none/a"), folder.path().string(), std::string(),
                                    folder.file(std::string(3000, 'n'))}) {
-        EXPECT_EQ(stream.init(output(bad)), -1) << bad;
-        EXPECT_EQ(stream.init(source(bad + "/x")), -1) << bad;
+        EXPECT_EQ(stream.init(output(bad)), QvStatus::failed) << bad;
+        EXPECT_EQ(stream.init(source(bad + "/x")), QvStatus::failed) << bad;
         EXPECT_FALSE(stream.inited());
     }
-    EXPECT_EQ(stream.init(output(folder.file("a"), -1)), -1);
-    EXPECT_EQ(stream.init(AnyDict("outfilename", 5)), -1);
+    EXPECT_EQ(stream.init(output(folder.file("a"), -1)), QvStatus::failed);
+    EXPECT_EQ(stream.init(AnyDict("outfilename", 5)), QvStatus::failed);
     NoMemory none;
     PlatformScope scope(none);
-    EXPECT_EQ(stream.init(output(folder.file("b"))), -1);
+    EXPECT_EQ(stream.init(output(folder.file("b"))), QvStatus::failed);
 }
 
 TEST_F(FileStream, NamesOfAnyKindReachTheDisc) {
@@ -154,11 +183,16 @@ TEST_F(FileStream, AFullDiscReachesTheWriterAndWhoeverCloses) {
 TEST_F(FileStream, PatchesGoInWhenTheFileIsClosed) {
     for (const int abort : {0, 1}) {
         bufstream* in = begin();
+        std::vector<std::string> heard;
+        HeardItems observer(heard);
+        stream.registerObserver(&observer);
         put(in, "0123456789");
         std::string data = "AB";
         EXPECT_EQ(tell(in, BUF_SEEK_INFO, BufSeekInfo{1, data.data(), 2}), 0u);
         data = "XX";  // the stream has its own copy
         tell(in, BUF_SEEK_INFO, BufSeekInfo{2, "c", 1});
+        EXPECT_EQ(heard.size(), 2u);
+        stream.unregisterAllObservers();
         put(in, "tail");
         stream.destroy(abort);
         EXPECT_EQ(bytes(), abort ? "0123456789tail" : "0Ac3456789tail");
@@ -287,6 +321,21 @@ TEST(QvFileBufStreamRwWrite, GoesBackReadsAndWritesOn) {
     EXPECT_EQ(tell(bs, FILE_SEEK, int64_t{-1}), BUFSTREAM_FAILED);
     stream.destroy(0);
     EXPECT_EQ(TempFolder::read(folder.file("rw.bin")), "00PP456789ab--efghijXYZ");
+}
+
+TEST(QvFileBufStreamRwWrite, TheRestOfABlockIsReadOnlyOnce) {
+    TempFolder folder;
+    QvFileBufStreamRwWrite stream;
+    ASSERT_EQ(stream.init(output(folder.file("rw.bin"), 16)), 0);
+    bufstream* bs = stream.input();
+    const std::string content = patternBytes(100);
+    copyIn(bs, content);
+    tell(bs, FILE_SEEK, int64_t{0});
+    tell(bs, FILE_MODE_READ);
+    EXPECT_EQ(take(bs, 14), content.substr(0, 14));
+    EXPECT_EQ(take(bs, 5), content.substr(14, 5));
+    EXPECT_EQ(bs->confirm(bs, 1000), 11u) << "what the buffer of 16 bytes holds";
+    EXPECT_EQ(copyOut(bs, 1000), content.substr(30));
 }
 
 TEST(QvFileBufStreamRwWrite, AbortDropsTheBufferAndFlushCloses) {

@@ -52,7 +52,7 @@ TEST_F(Transcoder, EachFrameBringsItsSamples) {
         pipe.sound->params.set("samplerate", row.outRate);
         QvTask task;
         task.setEncoder(&pipe);
-        EXPECT_EQ(task.link(&decoder, 1, 0, 0) + task.link(&decoder, 2, 0, 0), 1);
+        EXPECT_EQ(task.link(&decoder, qvVideoStream, 0, 0) + task.link(&decoder, qvAudioStream, 0, 0), 1);
         NotedTranscoder t(events, &task);
         t.onProcess = [&] {
             const auto written = static_cast<long long>(pipe.video.numbers.size());
@@ -251,12 +251,12 @@ TEST_F(Transcoder, WithoutAThreadNothingHangs) {
     {
         NoThreads none;
         PlatformScope scope(none);
-        EXPECT_EQ(job.t.transcode(false), -1);
+        EXPECT_EQ(job.t.transcode(false), QvStatus::failed);
         EXPECT_STREQ(job.t.errorDesc(), "Failed to spawn processing thread");
         EXPECT_EQ(job.t.getState(), QvTranscoder::transcoding);
         EXPECT_EQ(job.events.take(), "open abort");
         EXPECT_EQ(job.t.transcode(true), 0);
-        EXPECT_EQ(job.t.transcode(false), -1);
+        EXPECT_EQ(job.t.transcode(false), QvStatus::failed);
     }
     EXPECT_EQ(job.t.stop(), 0);
     EXPECT_EQ(job.t.getState(), QvTranscoder::connected);

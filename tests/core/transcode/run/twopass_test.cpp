@@ -15,7 +15,7 @@ struct TwoPass {
                                          Any(QvFramerate::f25p())));
         pipe->setFilename(Any(folder.file("out.x").c_str()));
         task.setEncoder(pipe.get());
-        EXPECT_EQ(task.link(&decoder, 1, 0, 0), 0) << task.errorDesc();
+        EXPECT_EQ(task.link(&decoder, qvVideoStream, 0, 0), 0) << task.errorDesc();
         outputs.watched = "rawvenc.meta";
         t.setParam("twoPass", 1);
         t.setParam("metaName", folder.file("stats").c_str());

@@ -10,8 +10,8 @@ TEST(PostprocessCommand, PlaceholdersAreFileNamesThatCanDoNoHarm) {
     other.extra.set("filename", "/in/it's.wav");
     other.audio(10, 48000);
     job.pipe.audio(48000);
-    ASSERT_EQ(job.task.link(&job.decoder, 1, 0, 0), 0);
-    ASSERT_EQ(job.task.link(&other, 2, 0, 1), 1);
+    ASSERT_EQ(job.task.link(&job.decoder, qvVideoStream, 0, 0), 0);
+    ASSERT_EQ(job.task.link(&other, qvAudioStream, 0, 1), 1);
     job.pipe.muxer = &muxer;
     job.pipe.filename = "/out/x#1.raw";
     const auto commandOf = [&](const Any& command) -> std::string {

@@ -15,8 +15,8 @@ TEST(TaskParams, ALinksOwnWinOverTheTasks) {
     ProcessParams own(AnyDict("inOutPoints", points, "chapters", AnyVector(Any(5)), "smartRender", 2));
     own.setHoldLast(true);
     own.set("filters", AnyDict());
-    ASSERT_EQ(job.task.link(&job.decoder, 1, 0, 0, own), 0);
-    ASSERT_EQ(job.task.link(&job.decoder, 2, 0, 0), 1);
+    ASSERT_EQ(job.task.link(&job.decoder, qvVideoStream, 0, 0, own), 0);
+    ASSERT_EQ(job.task.link(&job.decoder, qvAudioStream, 0, 0), 1);
     job.task.setProcessParams(ProcessParams(AnyDict("inOutPoints", otherPoints, "smartRender", 1)), 0);
     job.task.setProcessParams(ProcessParams(AnyDict("filters", AnyDict("a", 1))), 1);
     job.task.setProcessParams(
@@ -58,6 +58,7 @@ TEST(TaskChecks, CodedSoundThatPassesThrough) {
     FakePlugin plugin;
     plugin.audio("aquant").add(new QvAfModule);
     for (const auto& row : rows) {
+        SCOPED_TRACE(&row - rows);
         Job job;
         auto encoder = std::make_unique<DolbyEncoder>();
         encoder->params = job.pipe.audios[0]->params;
@@ -71,9 +72,14 @@ TEST(TaskChecks, CodedSoundThatPassesThrough) {
         EXPECT_EQ(job.task.checkLegal(messages), row.result);
         ASSERT_EQ(messages.size(), row.result ? 1 : 0);
         EXPECT_STREQ(row.result ? messages.at(0).asString() : "", row.text);
-        NotedTranscoder t(job.events, &job.task);
-        if (row.result == QvStatus::notLegal) {
-            EXPECT_EQ(t.transcode(true), QvStatus::notLegal);
+        const bool runs = row.result != QvStatus::notLegal;
+        for (const bool synchronous : {true, false}) {
+            NotedTranscoder t(job.events, &job.task);
+            ASSERT_EQ(t.transcode(synchronous), runs && synchronous ? 0 : row.result);
+            if (runs) job.events.waitFor("close done0");
+            EXPECT_EQ(job.events.take().empty(), !runs);
+            EXPECT_EQ(t.errorCode(), row.result) << "a warning stays";
+            EXPECT_STREQ(t.errorDesc(), row.text);
         }
     }
 }
@@ -93,7 +99,7 @@ struct Stored {
         made->store(encoder);
         state = AnyDict("__version__", "2.0", "__class__", "TranscodeTask", "encoder", encoder, "files",
                         AnyVector(Any(AnyDict("filename", input.c_str()))), "postProcess", "true %i");
-        setStream(2, input, 0,
+        setStream(qvAudioStream, input, 0,
                   AnyDict("inOutPoints", AnyVector(Any(MediaTime(0.001)), Any(MediaTime(0.006)))));
     }
     ~Stored() { decoders.deleteAll(); }
@@ -162,8 +168,8 @@ TEST(TaskState, DamageIsToldAndNothingIsLeft) {
         {[](Stored& s) { s.state.remove("files"); },
          "Task.restore: invalid task state structure - no input file(s) specified"},
         {[](Stored& s) { s.setFile(AnyDict("filename", "/nowhere.wav")); }, unopened},
-        {[](Stored& s) { s.setStream(1, s.input, 0, {}); }, ""},
-        {[](Stored& s) { s.setStream(2, "/other.wav", 0, {}); },
+        {[](Stored& s) { s.setStream(qvVideoStream, s.input, 0, {}); }, ""},
+        {[](Stored& s) { s.setStream(qvAudioStream, "/other.wav", 0, {}); },
          "no available decoders, decoder must be cloned..."},
     };
     for (const auto& row : rows) {

@@ -97,7 +97,7 @@ TEST(SegmentDurations, StoredPointsAreUsableWhateverTheyAre) {
         {AnyVector(Any(MediaTime(1.0))), 0, 4},
     };
     for (const auto& row : rows) {
-        QvIStream stream(&file, 1, 0);
+        QvIStream stream(&file, qvVideoStream, 0);
         stream.params.set("inOutPoints", row.points);
         EXPECT_EQ(stream.inPoint(), MediaTime(row.in));
         EXPECT_EQ(stream.effectiveDuration(), MediaTime(row.length));
