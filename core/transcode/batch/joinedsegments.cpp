@@ -7,6 +7,7 @@
 #include "core/arch/qvassert.h"
 #include "core/decode/qvdecoder.h"
 #include "core/engine/log/qvlog.h"
+#include "core/engine/qvutil.h"
 #include "core/engine/status.h"
 
 using qvlist::at;
@@ -62,6 +63,19 @@ long long JoinedSegments::sampleTotal(int stream) const {
         if (inRange(stream, segment.audios))
             total += at(segment.audios, stream)->span(at(audioJobs, stream).outSamplerate).owed;
     return total;
+}
+
+long long JoinedSegments::soundTotal(int stream) const {
+    if (videoJobs.empty())
+        return inRange(stream, totalSamples) ? at(totalSamples, stream) : sampleTotal(stream);
+    long long most = 0;
+    for (int i = 0; i < sizeOf(videoJobs); ++i) {
+        const QvFramerate& rate = at(videoJobs, i).outFramerate;
+        const int frames = inRange(i, totalFrames) ? at(totalFrames, i) : frameTotal(i);
+        if (rate.rate().ratio() > 0)
+            most = std::max(most, QvUtil::samplesForFrames(frames, rate, at(audioJobs, stream).outSamplerate));
+    }
+    return most;
 }
 
 int JoinedSegments::prepare() {

@@ -55,7 +55,9 @@ class JoinedSegments {
     // it unconverted.
     bool smartParams(const Pair& address, AnyDict& out) const;
     int frameTotal(int stream) const;  // at any time
-    long long sampleTotal(int stream) const;
+    long long sampleTotal(int stream) const;  // of the sources' sound
+    // What reads give: where there is a picture, sound lasts as long as it does.
+    long long soundTotal(int stream) const;
 
     // Builds each conversion once, to see that it can be; again when its segment begins.
     int prepare();

@@ -81,6 +81,17 @@ TEST_F(Joined, SegmentsOfDifferentFormatsComeOutAsOne) {
     task.reset();
 }
 
+// Silence that fills one segment takes nothing from the sound of the next.
+TEST_F(Joined, SoundThatEndsEarlyDoesNotShortenTheNext) {
+    addBoth(a_, short_);
+    addBoth(a_, aSound_);
+    const auto open = restore();
+    ASSERT_TRUE(open->task) << open->error;
+    EXPECT_EQ(run(*open->task), 0);
+    EXPECT_EQ(samples(written(".wav").substr(80)),
+              std::vector<int>(9600, 3000) + std::vector<int>(9600, 0) + std::vector<int>(19200, 1000));
+}
+
 TEST_F(Joined, CutsOfOneFileMeetToTheFrameAndSample) {
     std::mt19937 random(5);
     const AnyDict ramp = film("r.yuv", 100, 1, f25, 16, 8);
