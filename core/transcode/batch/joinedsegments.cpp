@@ -14,6 +14,19 @@ using qvlist::at;
 using qvlist::inRange;
 using qvlist::sizeOf;
 
+namespace {
+
+template <class Streams>
+MediaTime shortest(const Streams& streams) {
+    MediaTime length;
+    for (const auto& stream : streams)
+        if (stream == streams.front() || stream->span().duration() < length)
+            length = stream->span().duration();
+    return length;
+}
+
+}  // namespace
+
 const QvIStream* BatchSegment::input(int type, int stream) const {
     if (type == qvVideoStream && inRange(stream, videos)) return &at(videos, stream)->input();
     if (type == qvAudioStream && inRange(stream, audios)) return &at(audios, stream)->input();
@@ -97,9 +110,8 @@ int JoinedSegments::prepare() {
             qv_dbg()->info("[BatchDecoder] Opening segment audio stream %d", k);
             const SegmentAudio* like = before ? at(before->audios, k).get() : nullptr;
             if (const int result = at(segment.audios, k)->prepare(at(audioJobs, k), like, why)) return result;
-            const MediaTime length = at(segment.audios, k)->span().duration();
-            segment.sound = k == 0 ? length : std::min(segment.sound, length);
         }
+        segment.length = segment.videos.empty() ? shortest(segment.audios) : shortest(segment.videos);
         before = &segment;
     }
     return QvStatus::ok;
@@ -250,11 +262,12 @@ int JoinedSegments::readLedSound(int n, int stream) {
     return fill(*at(at(segments, current).audios, stream), n, at(sounds, stream).buffer, current);
 }
 
-// Samples that a segment gives to a stream where sound leads: all streams end with the shortest.
+// Samples that a segment gives to a stream where sound leads: those of a picture that is passed on, else all
+// streams end with the shortest.
 long long JoinedSegments::owed(const BatchSegment& segment, int stream) const {
     const SegmentSpan& span = at(segment.audios, stream)->span();
-    if (span.duration() <= segment.sound) return span.owed;
-    return std::min(span.owed, segment.sound.position(at(audioJobs, stream).outSamplerate));
+    if (span.duration() == segment.length) return span.owed;
+    return segment.length.position(at(audioJobs, stream).outSamplerate);
 }
 
 int JoinedSegments::readLeadingSound(int n, int stream) {
@@ -264,7 +277,7 @@ int JoinedSegments::readLeadingSound(int n, int stream) {
         SegmentAudio& audio = *at(segment.audios, stream);
         const long long left = owed(segment, stream) - audio.samplesRead();
         int result = QvStatus::ok;
-        if (left < 1 || audio.ended())
+        if (left < 1 || (audio.ended() && segment.videos.empty()))
             result = nextSound(stream);
         else
             result = fill(audio, static_cast<int>(std::min<long long>(left, n - sound.buffer.samples())),

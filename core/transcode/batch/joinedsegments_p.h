@@ -36,7 +36,7 @@ int sizeOf(const std::vector<T>& list) {
 struct BatchSegment {
     std::vector<std::unique_ptr<SegmentVideo>> videos;  // in the order of the output's
     std::vector<std::unique_ptr<SegmentAudio>> audios;
-    MediaTime sound;  // how long its shortest sound is, since prepare
+    MediaTime length;  // of its shortest picture, without one of its shortest sound; since prepare
 
     const QvIStream* input(int type, int stream) const;  // null for a stream that it does not have
 };

@@ -440,6 +440,25 @@ TEST_F(BatchDecoder, SoundLeadsWhereThePictureIsPassedOn) {
     EXPECT_EQ(readAll(1920), values);
     joined.close();
 
+    // Sound that is shorter than such a picture is filled up, and longer sound is cut.
+    joined.clearSegments();
+    for (const double end : {0.3, 0.9}) {
+        std::vector<QvIStream> streams{{&a, 1, 0}, {&a, 2, 0}};
+        streams[0].params.setInOutPoints({frameTime(5, f25), frameTime(10, f25)});
+        streams[1].params.setInOutPoints({MediaTime(0.2), MediaTime(end)});
+        ASSERT_EQ(insert(streams), 0);
+    }
+    ASSERT_EQ(joined.open(), 0);
+    EXPECT_NE(failureOf([&] { joined.setParam("smartRenderingOn", Pair(1, 0)); }), "no failure");
+    values = counting(9600, 4800);
+    add(values, std::vector<int>(4800, 0));
+    add(values, counting(9600, 9600));
+    for (const int block : {1000, 1920}) {
+        joined.seekToSample(0, 0);
+        EXPECT_EQ(readAll(block), values);
+    }
+    joined.close();
+
     // Filters would be passed by, and so would a source that can't.
     VideoJobDescription other = picture(f50);
     joined.clearOutputStreams(1);
