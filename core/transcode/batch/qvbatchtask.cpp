@@ -165,12 +165,13 @@ class QvBatchTask::Attempt {
 int QvBatchTask::restore(const QvTaskState& state, QvDPipeList& decoders, QvEncodePipe** encoderOut,
                          int options, QvFileOpenCb* callback) {
     drop();
-    if (state.streams_out().empty() || state.streams_in().empty()) {
+    const bool settings = !state.getDict("encoder").empty();
+    if (state.streams_in().empty() || (settings && state.streams_out().empty())) {
         setError(QvStatus::invalidStructure,
                  "QvBatchTask::initFromState - invalid task struct, no output streams defined.");
         QV_FAIL(errorDesc());
     }
-    if (state.getDict("encoder").empty())
+    if (!settings)
         return setError(QvStatus::invalidStructure, "Invalid task structure - missing encoder settings");
     Attempt made(*this);
     made.pipe.reset(QvEncodePipe::create());

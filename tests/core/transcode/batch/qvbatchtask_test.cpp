@@ -298,6 +298,10 @@ TEST_F(Joined, AStateThatIsNoTaskIsRefused) {
     };
     state_.remove("streams");
     EXPECT_EQ(refusal(), "QvBatchTask::initFromState - invalid task struct, no output streams defined.");
+    state_.get("encoder").asDict().set("streams", AnyVector());
+    EXPECT_EQ(refusal(), "QvBatchTask::initFromState - invalid task struct, no output streams defined.");
+    state_.remove("encoder");
+    EXPECT_EQ(refusal(), "Invalid task structure - missing encoder settings");
     state_.get("streams").asVector().at(0).asDict().get("sources").asVector().remove(0);
     state_.remove("#nsegs");
     EXPECT_EQ(refusal(),
