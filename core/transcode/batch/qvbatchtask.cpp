@@ -1,6 +1,8 @@
 #include "core/transcode/batch/qvbatchtask.h"
 
 #include <algorithm>
+#include <set>
+#include <string>
 #include <utility>
 
 #include "core/arch/qvassert.h"
@@ -10,6 +12,7 @@
 #include "core/transcode/batch/qvbatchdecoder.h"
 #include "core/transcode/batch/segmentinputs_p.h"
 #include "core/transcode/batch/segmentjoin_p.h"
+#include "core/transcode/task/postprocess_p.h"
 #include "core/transcode/task/qvtaskstate.h"
 #include "core/transcode/task/segmentdurations_p.h"
 
@@ -47,6 +50,18 @@ int QvBatchTask::checkDurations() {
     for (const auto& segment : segments_)
         if (segment->status == QvInputSegment::opened) qvAdjustSegmentDurations(fedStreams(*segment));
     return QvStatus::ok;
+}
+
+Any QvBatchTask::currentPostprocessCommand() const {
+    if (!batchDecoder_) return QvTask::currentPostprocessCommand();
+    QvDPipeList inputs;
+    std::set<std::string> names;
+    for (const auto& segment : segments_)
+        for (QvDecodePipe* decoder : segment->decoders) {
+            const Any name = decoder->QvCodec::getParam("filename").toString();
+            if (names.insert(name.asString("")).second) inputs.append(decoder);
+        }
+    return qvPostprocessCommand(postprocessCommand(), inputs, encoder());
 }
 
 // --- Opening.

@@ -314,6 +314,28 @@ TEST_F(Joined, AStateThatIsNoTaskIsRefused) {
     EXPECT_NE(failureOf([&] { task.segment(0); }), "no failure");
 }
 
+TEST_F(Joined, TheCommandAfterwardsGetsTheFilesOfAllSegments) {
+    for (const AnyDict& picture : {a_, b_, a_}) addBoth(picture, aSound_);
+    state_.setSegmentEnabled(1, false);
+    state_.setPostprocessCommand("cat %i2 %i");
+    const auto quoted = [](const AnyDict& file) {
+        return "'" + std::string(file.get("filename").asString()) + "'";
+    };
+    const std::string a = quoted(a_), b = quoted(b_), sound = quoted(aSound_);
+    for (const bool all : {true, false}) {
+        const auto open = restore(all ? 0 : QvBatchTask::skipDisabled);
+        ASSERT_TRUE(open->task) << open->error;
+        EXPECT_STREQ(open->task->currentPostprocessCommand().asString(),
+                     ("cat " + sound + " " + a + " " + sound + (all ? " " + b : "")).c_str());
+    }
+    state_.swapSegments(0, 1);
+    state_.removeSegment(2);
+    const auto single = restore(QvBatchTask::skipDisabled);
+    ASSERT_TRUE(single->task);
+    EXPECT_STREQ(single->task->currentPostprocessCommand().asString(),
+                 ("cat " + sound + " " + a + " " + sound).c_str());
+}
+
 // Files are open only while their segment is read.
 TEST_F(Joined, ManySegmentsNeedFewOpenFiles) {
     for (int i = 0; i < 150; ++i) addBoth(i % 2 == 0 ? a_ : b_, i % 3 == 0 ? aSound_ : bSound_);
