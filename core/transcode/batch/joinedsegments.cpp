@@ -287,7 +287,8 @@ int JoinedSegments::readLeadingSound(int n, int stream) {
     return sound.buffer.samples() > 0 ? QvStatus::ok : QvStatus::endOfStream;
 }
 
-// The later segments begin anew when their turn comes.
+// The later segments begin anew when their turn comes. Where video leads, all streams have left the first
+// segment together and go back together, for whoever has read the picture alone seeks nothing else.
 int JoinedSegments::restart(int stream, bool video) {
     if (video) {
         at(frames, stream).forget();
@@ -298,15 +299,22 @@ int JoinedSegments::restart(int stream, bool video) {
         sound.buffer.setPosition(-1);
         sound.segment = 0;
     }
+    const bool together = videoLeads() && current != 0;
     for (int i = 1; i < sizeOf(segments); ++i) {
         BatchSegment& segment = at(segments, i);
-        if (video)
+        if (together)
+            stopSegment(i);
+        else if (video)
             at(segment.videos, stream)->stop(why);
         else
             at(segment.audios, stream)->stop(why);
     }
     current = 0;
     if (segments.empty()) return QvStatus::ok;
+    if (together) {
+        for (FrameWindow& frame : frames) frame.forget();
+        return startSegment();
+    }
     return video ? startVideo(0, stream) : startAudio(0, stream);
 }
 

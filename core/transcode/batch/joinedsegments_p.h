@@ -62,7 +62,7 @@ class JoinedSegments {
     // Builds each conversion once, to see that it can be; again when its segment begins.
     int prepare();
     void makeOutputs();
-    // From the first segment on; each stream by itself.
+    // From the first segment on.
     int restart(int stream, bool video);
     // QvStatus::endOfStream after the last segment.
     int readFrame(int stream);

@@ -401,6 +401,17 @@ TEST_F(BatchDecoder, OnlyTheSegmentAtHandIsSelectedAndASecondRunIsTheSame) {
     run(f25, 48000);
     EXPECT_EQ(shown, first);
     EXPECT_EQ(heard, firstSound);
+    // The first of two passes reads the picture alone, and no more than that goes back.
+    for (const int frames : {2, 7, 13}) {
+        ASSERT_EQ(joined.seekToFrame(0, 0), 0);
+        ASSERT_EQ(joined.seekToSample(0, 0), 0);
+        for (int i = 0; i < frames; ++i) joined.readFrame(0);
+        ASSERT_EQ(joined.seekToFrame(0, 0), 0);
+        for (std::size_t k = 0; k < 4; ++k) EXPECT_EQ(sources[k]->chosen.size(), k == 0 ? 2U : 0U);
+        run(f25, 48000);
+        EXPECT_EQ(shown, first);
+        EXPECT_EQ(heard, firstSound);
+    }
     EXPECT_NE(failureOf([&] { joined.seekToFrame(1, 0); }), "no failure");
     EXPECT_NE(failureOf([&] { joined.seekToSample(1, 0); }), "no failure");
     ASSERT_EQ(joined.close(), 0);
