@@ -168,16 +168,43 @@ TEST_F(Joined, TheChannelMapOfASourceHolds) {
     const AnyDict stereo = entry(
         folder_.write("two.wav", riff(wavChunk("fmt ", wavFormat(1, 2, 48000, 16)) + wavChunk("data", both))),
         AnyDict());
-    addBoth(a_, stereo);
-    addBoth(a_, stereo);
-    AnyDict& second =
-        state_.get("streams").asVector().at(1).asDict().get("sources").asVector().at(1).asDict();
-    second.set("process", AnyDict("audioChannelMap", AnyVector(Any(AnyDict("channel", 1)))));
+    const struct {
+        AnyVector map;
+        int heard;
+        const char* line;
+    } rows[] = {
+        {AnyVector(), 150, ""},
+        {AnyVector(Any(AnyDict("channel", 1))), 200, ""},
+        // As in a link, a map that can't be used gives way to the default.
+        {AnyVector(Any(AnyDict("channel", 9))), 150, "input channel (9)>= nr of input cannels(2)"},
+        {AnyVector(Any(AnyDict("channel", 0, "stream", 1))), 150, "input stream number (1)"},
+        {AnyVector(Any(AnyDict("channel", 0)), Any(AnyDict("channel", 1))), 150, "it has 2 out channels"},
+    };
+    std::vector<int> expected;
+    for (const auto& row : rows) {
+        addBoth(a_, stereo);
+        AnyVector& sources = state_.get("streams").asVector().at(1).asDict().get("sources").asVector();
+        if (!row.map.empty())
+            sources.at(sources.size() - 1).asDict().set("process", AnyDict("audioChannelMap", row.map));
+        expected = expected + std::vector<int>(19200, row.heard);
+    }
+    LogCapture log;
     const auto open = restore();
     ASSERT_TRUE(open->task) << open->error;
+    for (const auto& row : rows) EXPECT_TRUE(log.contains(row.line)) << row.line;
     EXPECT_EQ(run(*open->task), 0);
-    EXPECT_EQ(samples(written(".wav").substr(80)),
-              std::vector<int>(19200, 150) + std::vector<int>(19200, 200));
+    EXPECT_TRUE(samples(written(".wav").substr(80)) == expected);
+
+    // A link would mix the two streams.
+    const AnyDict length("duration", 0.4),
+        two = entry("two.tg", AnyDict("name", "testgen", "streams",
+                                      AnyDict("auds", AnyVector(Any(length), Any(length)))));
+    addBoth(a_, two);
+    AnyVector& sources = state_.get("streams").asVector().at(1).asDict().get("sources").asVector();
+    sources.at(sources.size() - 1)
+        .asDict()
+        .set("process", AnyDict("audioChannelMap", AnyVector(Any(AnyDict("channel", 0, "stream", 1)))));
+    EXPECT_EQ(failureOf([&] { restore(); }), "A joined segment can't mix several streams of its file");
 }
 
 TEST_F(Joined, SegmentsThatCanNotBeOpenedAreLeftOutUnlessTheyMustNot) {
