@@ -86,7 +86,8 @@ long long JoinedSegments::soundTotal(int stream) const {
         const QvFramerate& rate = at(videoJobs, i).outFramerate;
         const int frames = inRange(i, totalFrames) ? at(totalFrames, i) : frameTotal(i);
         if (rate.rate().ratio() > 0)
-            most = std::max(most, QvUtil::samplesForFrames(frames, rate, at(audioJobs, stream).outSamplerate));
+            most =
+                std::max(most, QvUtil::samplesForFrames(frames, rate, at(audioJobs, stream).outSamplerate));
     }
     return most;
 }

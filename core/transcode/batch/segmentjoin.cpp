@@ -53,8 +53,8 @@ AudioJobDescription audioJob(const QvEncodePipe& output, int number, const Audio
     return job;
 }
 
-// Whether the stream brings a map that suits the output. What a link would mix from several streams is refused:
-// a segment reads one.
+// Whether the stream brings a map that suits the output. What a link would mix from several streams is
+// refused: a segment reads one.
 bool hasChannelMap(const QvIStream& stream, int channels) {
     const AnyVector* own = stream.params.audioChannelMap();
     if (!own) return false;

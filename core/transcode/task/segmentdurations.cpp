@@ -29,8 +29,8 @@ bool sameFile(const QvIStream& a, const QvIStream& b) {
     return a.decoder == b.decoder || a.filename() == b.filename();
 }
 
-// An out point of 0 would be the end of the stream: where nothing is to play from the start, it is a tick later,
-// which is less than a frame or a sample.
+// An out point of 0 would be the end of the stream: where nothing is to play from the start, it is a tick
+// later, which is less than a frame or a sample.
 void endAt(QvIStream& stream, const MediaTime& time) { stream.setOutPoint(std::max(time, MediaTime(1))); }
 
 void endWith(QvIStream& stream, const QvIStream& winner, const MediaTime& limit) {
