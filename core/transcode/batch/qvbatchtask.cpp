@@ -202,8 +202,8 @@ int QvBatchTask::restore(const QvTaskState& state, QvDPipeList& decoders, QvEnco
         constexpr const char* text =
             "BatchTask.initFromState: No sucessfully opened / enabled input segments, bailing out.";
         qv_dbg()->error("%s", text);
-        if (!*errorDesc()) setError(QvStatus::noSegment, "%s", text);  // else it names a file
-        return QvStatus::noSegment;
+        const std::string reason = *errorDesc() ? errorDesc() : text;  // which file, if one is to blame
+        return setError(QvStatus::noSegment, "%s", reason.c_str());
     }
     checkDurations();
     setEncoder(made.pipe.get());

@@ -251,6 +251,8 @@ TEST_F(Joined, SegmentsThatCanNotBeOpenedAreLeftOutUnlessTheyMustNot) {
     QvEncodePipe* pipe = nullptr;
     EXPECT_EQ(task.restore(state_, decoders, &pipe, QvBatchTask::skipDisabled), QvStatus::noSegment);
     EXPECT_TRUE(!pipe && decoders.empty() && task.nrLinks() == 0 && !task.encoder());
+    EXPECT_EQ(task.errorCode(), QvStatus::noSegment);
+    EXPECT_NE(std::string(task.errorDesc()).find("junk.wav' in input segment 2"), std::string::npos);
 }
 
 TEST_F(Joined, AStreamThatTheFileLacksFailsItsSegment) {
