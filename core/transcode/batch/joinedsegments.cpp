@@ -7,11 +7,25 @@
 #include "core/arch/qvassert.h"
 #include "core/decode/qvdecoder.h"
 #include "core/engine/log/qvlog.h"
+#include "core/engine/qvutil.h"
 #include "core/engine/status.h"
 
 using qvlist::at;
 using qvlist::inRange;
 using qvlist::sizeOf;
+
+namespace {
+
+template <class Streams>
+MediaTime shortest(const Streams& streams) {
+    MediaTime length;
+    for (const auto& stream : streams)
+        if (stream == streams.front() || stream->span().duration() < length)
+            length = stream->span().duration();
+    return length;
+}
+
+}  // namespace
 
 const QvIStream* BatchSegment::input(int type, int stream) const {
     if (type == qvVideoStream && inRange(stream, videos)) return &at(videos, stream)->input();
@@ -64,6 +78,20 @@ long long JoinedSegments::sampleTotal(int stream) const {
     return total;
 }
 
+long long JoinedSegments::soundTotal(int stream) const {
+    if (videoJobs.empty())
+        return inRange(stream, totalSamples) ? at(totalSamples, stream) : sampleTotal(stream);
+    long long most = 0;
+    for (int i = 0; i < sizeOf(videoJobs); ++i) {
+        const QvFramerate& rate = at(videoJobs, i).outFramerate;
+        const int frames = inRange(i, totalFrames) ? at(totalFrames, i) : frameTotal(i);
+        if (rate.rate().ratio() > 0)
+            most =
+                std::max(most, QvUtil::samplesForFrames(frames, rate, at(audioJobs, stream).outSamplerate));
+    }
+    return most;
+}
+
 int JoinedSegments::prepare() {
     why.clear();
     const BatchSegment* before = nullptr;
@@ -83,9 +111,8 @@ int JoinedSegments::prepare() {
             qv_dbg()->info("[BatchDecoder] Opening segment audio stream %d", k);
             const SegmentAudio* like = before ? at(before->audios, k).get() : nullptr;
             if (const int result = at(segment.audios, k)->prepare(at(audioJobs, k), like, why)) return result;
-            const MediaTime length = at(segment.audios, k)->span().duration();
-            segment.sound = k == 0 ? length : std::min(segment.sound, length);
         }
+        segment.length = segment.videos.empty() ? shortest(segment.audios) : shortest(segment.videos);
         before = &segment;
     }
     return QvStatus::ok;
@@ -236,11 +263,12 @@ int JoinedSegments::readLedSound(int n, int stream) {
     return fill(*at(at(segments, current).audios, stream), n, at(sounds, stream).buffer, current);
 }
 
-// Samples that a segment gives to a stream where sound leads: all streams end with the shortest.
+// Samples that a segment gives to a stream where sound leads: those of a picture that is passed on, else all
+// streams end with the shortest.
 long long JoinedSegments::owed(const BatchSegment& segment, int stream) const {
     const SegmentSpan& span = at(segment.audios, stream)->span();
-    if (span.duration() <= segment.sound) return span.owed;
-    return std::min(span.owed, segment.sound.position(at(audioJobs, stream).outSamplerate));
+    if (span.duration() == segment.length) return span.owed;
+    return segment.length.position(at(audioJobs, stream).outSamplerate);
 }
 
 int JoinedSegments::readLeadingSound(int n, int stream) {
@@ -250,7 +278,7 @@ int JoinedSegments::readLeadingSound(int n, int stream) {
         SegmentAudio& audio = *at(segment.audios, stream);
         const long long left = owed(segment, stream) - audio.samplesRead();
         int result = QvStatus::ok;
-        if (left < 1 || audio.ended())
+        if (left < 1 || (audio.ended() && segment.videos.empty()))
             result = nextSound(stream);
         else
             result = fill(audio, static_cast<int>(std::min<long long>(left, n - sound.buffer.samples())),
@@ -260,7 +288,8 @@ int JoinedSegments::readLeadingSound(int n, int stream) {
     return sound.buffer.samples() > 0 ? QvStatus::ok : QvStatus::endOfStream;
 }
 
-// The later segments begin anew when their turn comes.
+// The later segments begin anew when their turn comes. Where video leads, all streams have left the first
+// segment together and go back together, for whoever has read the picture alone seeks nothing else.
 int JoinedSegments::restart(int stream, bool video) {
     if (video) {
         at(frames, stream).forget();
@@ -271,15 +300,22 @@ int JoinedSegments::restart(int stream, bool video) {
         sound.buffer.setPosition(-1);
         sound.segment = 0;
     }
+    const bool together = videoLeads() && current != 0;
     for (int i = 1; i < sizeOf(segments); ++i) {
         BatchSegment& segment = at(segments, i);
-        if (video)
+        if (together)
+            stopSegment(i);
+        else if (video)
             at(segment.videos, stream)->stop(why);
         else
             at(segment.audios, stream)->stop(why);
     }
     current = 0;
     if (segments.empty()) return QvStatus::ok;
+    if (together) {
+        for (FrameWindow& frame : frames) frame.forget();
+        return startSegment();
+    }
     return video ? startVideo(0, stream) : startAudio(0, stream);
 }
 

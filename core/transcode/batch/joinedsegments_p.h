@@ -36,7 +36,7 @@ int sizeOf(const std::vector<T>& list) {
 struct BatchSegment {
     std::vector<std::unique_ptr<SegmentVideo>> videos;  // in the order of the output's
     std::vector<std::unique_ptr<SegmentAudio>> audios;
-    MediaTime sound;  // how long its shortest sound is, since prepare
+    MediaTime length;  // of its shortest picture, without one of its shortest sound; since prepare
 
     const QvIStream* input(int type, int stream) const;  // null for a stream that it does not have
 };
@@ -55,12 +55,14 @@ class JoinedSegments {
     // it unconverted.
     bool smartParams(const Pair& address, AnyDict& out) const;
     int frameTotal(int stream) const;  // at any time
-    long long sampleTotal(int stream) const;
+    long long sampleTotal(int stream) const;  // of the sources' sound
+    // What reads give: where there is a picture, sound lasts as long as it does.
+    long long soundTotal(int stream) const;
 
     // Builds each conversion once, to see that it can be; again when its segment begins.
     int prepare();
     void makeOutputs();
-    // From the first segment on; each stream by itself.
+    // From the first segment on.
     int restart(int stream, bool video);
     // QvStatus::endOfStream after the last segment.
     int readFrame(int stream);

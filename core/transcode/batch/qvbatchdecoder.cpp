@@ -180,7 +180,7 @@ void QvBatchDecoder::getStreamParams(int type, int stream, AnyDict& params) cons
     if (type == qvVideoStream && inRange(stream, p_->videoJobs))
         qvDescribeVideo(at(p_->videoJobs, stream), nrFrames(stream), params);
     else if (type == qvAudioStream && inRange(stream, p_->audioJobs))
-        qvDescribeAudio(at(p_->audioJobs, stream), nrSamples(stream), params);
+        qvDescribeAudio(at(p_->audioJobs, stream), p_->soundTotal(stream), params);
 }
 
 int QvBatchDecoder::nrFrames(int stream) const {

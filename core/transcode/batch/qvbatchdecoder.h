@@ -8,8 +8,8 @@
 //     while (joined.readFrame(0) == 0) use(*joined.getFramePtr(0));
 //
 // Video decides where a segment ends: sound that is longer is dropped there, and sound that is shorter is
-// filled up with silence. Without video the sound does. After the last segment every read gives -4
-// (QvStatus::ended).
+// filled up with silence. Without video the sound does. nrSamples() counts what the sources have, a stream's
+// "samples" what reads give. After the last segment every read gives -4 (QvStatus::endOfStream).
 //
 // The decoders belong to the caller and outlive this one. They hold no file and no codec before their segment
 // is near, if they can do without (see QvDecodePipe). One thread at a time.

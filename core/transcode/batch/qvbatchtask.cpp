@@ -1,6 +1,8 @@
 #include "core/transcode/batch/qvbatchtask.h"
 
 #include <algorithm>
+#include <set>
+#include <string>
 #include <utility>
 
 #include "core/arch/qvassert.h"
@@ -10,6 +12,7 @@
 #include "core/transcode/batch/qvbatchdecoder.h"
 #include "core/transcode/batch/segmentinputs_p.h"
 #include "core/transcode/batch/segmentjoin_p.h"
+#include "core/transcode/task/postprocess_p.h"
 #include "core/transcode/task/qvtaskstate.h"
 #include "core/transcode/task/segmentdurations_p.h"
 
@@ -47,6 +50,18 @@ int QvBatchTask::checkDurations() {
     for (const auto& segment : segments_)
         if (segment->status == QvInputSegment::opened) qvAdjustSegmentDurations(fedStreams(*segment));
     return QvStatus::ok;
+}
+
+Any QvBatchTask::currentPostprocessCommand() const {
+    if (!batchDecoder_) return QvTask::currentPostprocessCommand();
+    QvDPipeList inputs;
+    std::set<std::string> names;
+    for (const auto& segment : segments_)
+        for (QvDecodePipe* decoder : segment->decoders) {
+            const Any name = decoder->QvCodec::getParam("filename").toString();
+            if (names.insert(name.asString("")).second) inputs.append(decoder);
+        }
+    return qvPostprocessCommand(postprocessCommand(), inputs, encoder());
 }
 
 // --- Opening.
@@ -165,12 +180,13 @@ class QvBatchTask::Attempt {
 int QvBatchTask::restore(const QvTaskState& state, QvDPipeList& decoders, QvEncodePipe** encoderOut,
                          int options, QvFileOpenCb* callback) {
     drop();
-    if (state.streams_out().empty() || state.streams_in().empty()) {
+    const bool settings = !state.getDict("encoder").empty();
+    if (state.streams_in().empty() || (settings && state.streams_out().empty())) {
         setError(QvStatus::invalidStructure,
                  "QvBatchTask::initFromState - invalid task struct, no output streams defined.");
         QV_FAIL(errorDesc());
     }
-    if (state.getDict("encoder").empty())
+    if (!settings)
         return setError(QvStatus::invalidStructure, "Invalid task structure - missing encoder settings");
     Attempt made(*this);
     made.pipe.reset(QvEncodePipe::create());
@@ -186,8 +202,8 @@ int QvBatchTask::restore(const QvTaskState& state, QvDPipeList& decoders, QvEnco
         constexpr const char* text =
             "BatchTask.initFromState: No sucessfully opened / enabled input segments, bailing out.";
         qv_dbg()->error("%s", text);
-        if (!*errorDesc()) setError(QvStatus::noSegment, "%s", text);  // else it names a file
-        return QvStatus::noSegment;
+        const std::string reason = *errorDesc() ? errorDesc() : text;  // which file, if one is to blame
+        return setError(QvStatus::noSegment, "%s", reason.c_str());
     }
     checkDurations();
     setEncoder(made.pipe.get());

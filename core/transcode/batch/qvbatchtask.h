@@ -42,6 +42,9 @@ class QV_API QvBatchTask : public QvTask {
     // shortest stream where there is no video. Sound that is shorter stays so.
     int checkDurations() override;
 
+    // Of joined segments the inputs are their files, each once.
+    Any currentPostprocessCommand() const override;
+
     // Makes running objects of a stored task, as QvTask::restore does. A segment that can't be opened, or
     // whose file lacks a stream, is left out, unless the options say otherwise; -15 (QvStatus::noSegment):
     // none could be opened. Decoders and pipe are the caller's after 0 alone; the decoders outlive the task,

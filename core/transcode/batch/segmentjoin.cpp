@@ -1,5 +1,7 @@
 #include <algorithm>
 #include <cstddef>
+#include <string>
+#include <vector>
 
 #include "core/arch/qvassert.h"
 #include "core/encode/qvencodepipe.h"
@@ -8,6 +10,7 @@
 #include "core/job/streamformat.h"
 #include "core/transcode/batch/segmentjoin_p.h"
 #include "core/transcode/link/audio/audiomuxer.h"
+#include "core/transcode/link/audio/channelmatrix_p.h"
 #include "core/transcode/link/video/encodertraits_p.h"
 
 namespace {
@@ -50,10 +53,27 @@ AudioJobDescription audioJob(const QvEncodePipe& output, int number, const Audio
     return job;
 }
 
-// Which channel goes where, unless the stream brings a map that suits the output.
-void giveChannelMap(QvIStream& stream, QvEncodePipe& output, int number, int channels) {
+// Whether the stream brings a map that suits the output. What a link would mix from several streams is
+// refused: a segment reads one.
+bool hasChannelMap(const QvIStream& stream, int channels) {
     const AnyVector* own = stream.params.audioChannelMap();
-    if (own && own->size() == channels) return;
+    if (!own) return false;
+    const ChannelMatrix matrix(*own, stream.number);
+    std::vector<int> given;
+    for (int i = 0; i < stream.decoder->nrAudioStreams(); ++i)
+        given.push_back(stream.decoder->getAudioParam(i, "channels").asInt32(-1));
+    if (const std::string fault = matrix.fault(channels, given); !fault.empty()) {
+        qv_dbg()->warning("%s", fault.c_str());
+        return false;
+    }
+    for (const int named : matrix.streams())
+        QV_ASSERT_MSG(named == stream.number, "A joined segment can't mix several streams of its file");
+    return true;
+}
+
+// Which channel goes where.
+void giveChannelMap(QvIStream& stream, QvEncodePipe& output, int number, int channels) {
+    if (hasChannelMap(stream, channels)) return;
     AudioMuxer muxer;
     AnyVector map;
     if (muxer.init(stream.decoder, output.audioEncoder(number), channels, nullptr, stream.number) ==

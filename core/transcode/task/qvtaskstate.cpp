@@ -147,11 +147,9 @@ int QvTaskState::fileForSource(const Source& source) const { return fileByFilena
 
 AnyVector QvTaskState::streamsForFile(const Any& name) const {
     AnyVector found;
-    std::array<int, 3> numbers{};
     for (const Any& stream : streams_in()) {
-        const int type = typeOf(dictOf(stream)), number = numbers[placeOf(type)]++;
-        if (dictOf(dictOf(stream).getVector("sources").at(0)).get("file") == name)
-            found.append(Any(Pair(type, number)));
+        const AnyDict& first = dictOf(dictOf(stream).getVector("sources").at(0));
+        if (!first.empty() && first.get("file") == name) found.append(Any(addressOf(first)));
     }
     return found;
 }

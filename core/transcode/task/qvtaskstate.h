@@ -100,7 +100,7 @@ class QV_API QvTaskState : public AnyDict {
     // Index in inputFiles(), or -1. Asserts an input file without a name.
     int fileByFilename(const Any& name) const;
     int fileForSource(const Source& source) const;
-    // (type, number) of each output stream whose first segment comes from that file.
+    // (type, number) of the streams of that file which the first segment uses, in the order of the output's.
     AnyVector streamsForFile(const Any& name) const;
     // Drops the output streams that nothing feeds.
     void removeSlots();

@@ -29,15 +29,19 @@ bool sameFile(const QvIStream& a, const QvIStream& b) {
     return a.decoder == b.decoder || a.filename() == b.filename();
 }
 
+// An out point of 0 would be the end of the stream: where nothing is to play from the start, it is a tick
+// later, which is less than a frame or a sample.
+void endAt(QvIStream& stream, const MediaTime& time) { stream.setOutPoint(std::max(time, MediaTime(1))); }
+
 void endWith(QvIStream& stream, const QvIStream& winner, const MediaTime& limit) {
     if (stream.type == qvVideoStream) {
-        stream.setOutPoint(stream.inPoint() + limit);
+        endAt(stream, stream.inPoint() + limit);
         return;
     }
     const bool bound = sameFile(stream, winner);
     if (bound) stream.setInPoint(winner.inPoint());
     if (stream.effectiveDuration() > limit)
-        stream.setOutPoint(bound ? winner.outPoint() : stream.inPoint() + limit);
+        endAt(stream, bound ? winner.outPoint() : stream.inPoint() + limit);
 }
 
 }  // namespace

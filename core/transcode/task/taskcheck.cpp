@@ -135,7 +135,7 @@ int TaskCheck::dolbyPassthrough(const TransLink& link, int mode, const ProcessPa
             text =
                 "Not possible to use audio filters when both input and output audio formats are Dolby. "
                 "Please remove following filters: " +
-                filters;
+                filters + ".";
             verdict = QvStatus::failed;
         } else {
             if (!filters.empty())

@@ -401,6 +401,17 @@ TEST_F(BatchDecoder, OnlyTheSegmentAtHandIsSelectedAndASecondRunIsTheSame) {
     run(f25, 48000);
     EXPECT_EQ(shown, first);
     EXPECT_EQ(heard, firstSound);
+    // The first of two passes reads the picture alone, and no more than that goes back.
+    for (const int frames : {2, 7, 13}) {
+        ASSERT_EQ(joined.seekToFrame(0, 0), 0);
+        ASSERT_EQ(joined.seekToSample(0, 0), 0);
+        for (int i = 0; i < frames; ++i) joined.readFrame(0);
+        ASSERT_EQ(joined.seekToFrame(0, 0), 0);
+        for (std::size_t k = 0; k < 4; ++k) EXPECT_EQ(sources[k]->chosen.size(), k == 0 ? 2U : 0U);
+        run(f25, 48000);
+        EXPECT_EQ(shown, first);
+        EXPECT_EQ(heard, firstSound);
+    }
     EXPECT_NE(failureOf([&] { joined.seekToFrame(1, 0); }), "no failure");
     EXPECT_NE(failureOf([&] { joined.seekToSample(1, 0); }), "no failure");
     ASSERT_EQ(joined.close(), 0);
@@ -438,6 +449,25 @@ TEST_F(BatchDecoder, SoundLeadsWhereThePictureIsPassedOn) {
     std::vector<int> values = counting(9600, 9600);
     add(values, counting(38400, 5760));
     EXPECT_EQ(readAll(1920), values);
+    joined.close();
+
+    // Sound that is shorter than such a picture is filled up, and longer sound is cut.
+    joined.clearSegments();
+    for (const double end : {0.3, 0.9}) {
+        std::vector<QvIStream> streams{{&a, 1, 0}, {&a, 2, 0}};
+        streams[0].params.setInOutPoints({frameTime(5, f25), frameTime(10, f25)});
+        streams[1].params.setInOutPoints({MediaTime(0.2), MediaTime(end)});
+        ASSERT_EQ(insert(streams), 0);
+    }
+    ASSERT_EQ(joined.open(), 0);
+    EXPECT_NE(failureOf([&] { joined.setParam("smartRenderingOn", Pair(1, 0)); }), "no failure");
+    values = counting(9600, 4800);
+    add(values, std::vector<int>(4800, 0));
+    add(values, counting(9600, 9600));
+    for (const int block : {1000, 1920}) {
+        joined.seekToSample(0, 0);
+        EXPECT_EQ(readAll(block), values);
+    }
     joined.close();
 
     // Filters would be passed by, and so would a source that can't.
@@ -485,9 +515,9 @@ TEST_F(BatchDecoder, AnswersAsADecoderDoes) {
         {"audio0/channels", 2},
         {"audio0/bitsPerSample", 24},
         {"audio0/bytesPerSample", 3},
-        {"audio0/samples", 88200LL},
-        {"audio0/duration", 2.0},
-        {"audio0/aDuration", 2.0},
+        {"audio0/samples", 88288LL},  // as long as the picture
+        {"audio0/duration", 88288 / 44100.0},
+        {"audio0/aDuration", 88288 / 44100.0},
         {"audio0/_selected", 1},
     };
     for (const auto& row : rows) {
@@ -499,6 +529,7 @@ TEST_F(BatchDecoder, AnswersAsADecoderDoes) {
         else
             EXPECT_EQ(answer, row.answer) << row.name;
     }
+    EXPECT_EQ(joined.nrSamples(0), 88200) << "of the source";
     EXPECT_TRUE(joined.QvCodec::getParam("video1").asDict().empty());
     a.extra.set("notSeekable", 1);
     EXPECT_TRUE(joined.QvCodec::getParam("notSeekable").isTrue());

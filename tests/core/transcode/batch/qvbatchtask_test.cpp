@@ -81,6 +81,17 @@ TEST_F(Joined, SegmentsOfDifferentFormatsComeOutAsOne) {
     task.reset();
 }
 
+// Silence that fills one segment takes nothing from the sound of the next.
+TEST_F(Joined, SoundThatEndsEarlyDoesNotShortenTheNext) {
+    addBoth(a_, short_);
+    addBoth(a_, aSound_);
+    const auto open = restore();
+    ASSERT_TRUE(open->task) << open->error;
+    EXPECT_EQ(run(*open->task), 0);
+    EXPECT_EQ(samples(written(".wav").substr(80)),
+              std::vector<int>(9600, 3000) + std::vector<int>(9600, 0) + std::vector<int>(19200, 1000));
+}
+
 TEST_F(Joined, CutsOfOneFileMeetToTheFrameAndSample) {
     std::mt19937 random(5);
     const AnyDict ramp = film("r.yuv", 100, 1, f25, 16, 8);
@@ -157,16 +168,43 @@ TEST_F(Joined, TheChannelMapOfASourceHolds) {
     const AnyDict stereo = entry(
         folder_.write("two.wav", riff(wavChunk("fmt ", wavFormat(1, 2, 48000, 16)) + wavChunk("data", both))),
         AnyDict());
-    addBoth(a_, stereo);
-    addBoth(a_, stereo);
-    AnyDict& second =
-        state_.get("streams").asVector().at(1).asDict().get("sources").asVector().at(1).asDict();
-    second.set("process", AnyDict("audioChannelMap", AnyVector(Any(AnyDict("channel", 1)))));
+    const struct {
+        AnyVector map;
+        int heard;
+        const char* line;
+    } rows[] = {
+        {AnyVector(), 150, ""},
+        {AnyVector(Any(AnyDict("channel", 1))), 200, ""},
+        // As in a link, a map that can't be used gives way to the default.
+        {AnyVector(Any(AnyDict("channel", 9))), 150, "input channel (9)>= nr of input cannels(2)"},
+        {AnyVector(Any(AnyDict("channel", 0, "stream", 1))), 150, "input stream number (1)"},
+        {AnyVector(Any(AnyDict("channel", 0)), Any(AnyDict("channel", 1))), 150, "it has 2 out channels"},
+    };
+    std::vector<int> expected;
+    for (const auto& row : rows) {
+        addBoth(a_, stereo);
+        AnyVector& sources = state_.get("streams").asVector().at(1).asDict().get("sources").asVector();
+        if (!row.map.empty())
+            sources.at(sources.size() - 1).asDict().set("process", AnyDict("audioChannelMap", row.map));
+        expected = expected + std::vector<int>(19200, row.heard);
+    }
+    LogCapture log;
     const auto open = restore();
     ASSERT_TRUE(open->task) << open->error;
+    for (const auto& row : rows) EXPECT_TRUE(log.contains(row.line)) << row.line;
     EXPECT_EQ(run(*open->task), 0);
-    EXPECT_EQ(samples(written(".wav").substr(80)),
-              std::vector<int>(19200, 150) + std::vector<int>(19200, 200));
+    EXPECT_TRUE(samples(written(".wav").substr(80)) == expected);
+
+    // A link would mix the two streams.
+    const AnyDict length("duration", 0.4),
+        two = entry("two.tg", AnyDict("name", "testgen", "streams",
+                                      AnyDict("auds", AnyVector(Any(length), Any(length)))));
+    addBoth(a_, two);
+    AnyVector& sources = state_.get("streams").asVector().at(1).asDict().get("sources").asVector();
+    sources.at(sources.size() - 1)
+        .asDict()
+        .set("process", AnyDict("audioChannelMap", AnyVector(Any(AnyDict("channel", 0, "stream", 1)))));
+    EXPECT_EQ(failureOf([&] { restore(); }), "A joined segment can't mix several streams of its file");
 }
 
 TEST_F(Joined, SegmentsThatCanNotBeOpenedAreLeftOutUnlessTheyMustNot) {
@@ -213,6 +251,8 @@ TEST_F(Joined, SegmentsThatCanNotBeOpenedAreLeftOutUnlessTheyMustNot) {
     QvEncodePipe* pipe = nullptr;
     EXPECT_EQ(task.restore(state_, decoders, &pipe, QvBatchTask::skipDisabled), QvStatus::noSegment);
     EXPECT_TRUE(!pipe && decoders.empty() && task.nrLinks() == 0 && !task.encoder());
+    EXPECT_EQ(task.errorCode(), QvStatus::noSegment);
+    EXPECT_NE(std::string(task.errorDesc()).find("junk.wav' in input segment 2"), std::string::npos);
 }
 
 TEST_F(Joined, AStreamThatTheFileLacksFailsItsSegment) {
@@ -287,6 +327,10 @@ TEST_F(Joined, AStateThatIsNoTaskIsRefused) {
     };
     state_.remove("streams");
     EXPECT_EQ(refusal(), "QvBatchTask::initFromState - invalid task struct, no output streams defined.");
+    state_.get("encoder").asDict().set("streams", AnyVector());
+    EXPECT_EQ(refusal(), "QvBatchTask::initFromState - invalid task struct, no output streams defined.");
+    state_.remove("encoder");
+    EXPECT_EQ(refusal(), "Invalid task structure - missing encoder settings");
     state_.get("streams").asVector().at(0).asDict().get("sources").asVector().remove(0);
     state_.remove("#nsegs");
     EXPECT_EQ(refusal(),
@@ -297,6 +341,28 @@ TEST_F(Joined, AStateThatIsNoTaskIsRefused) {
     EXPECT_NE(refusal(), "no failure");
     QvBatchTask task;
     EXPECT_NE(failureOf([&] { task.segment(0); }), "no failure");
+}
+
+TEST_F(Joined, TheCommandAfterwardsGetsTheFilesOfAllSegments) {
+    for (const AnyDict& picture : {a_, b_, a_}) addBoth(picture, aSound_);
+    state_.setSegmentEnabled(1, false);
+    state_.setPostprocessCommand("cat %i2 %i");
+    const auto quoted = [](const AnyDict& file) {
+        return "'" + std::string(file.get("filename").asString()) + "'";
+    };
+    const std::string a = quoted(a_), b = quoted(b_), sound = quoted(aSound_);
+    for (const bool all : {true, false}) {
+        const auto open = restore(all ? 0 : QvBatchTask::skipDisabled);
+        ASSERT_TRUE(open->task) << open->error;
+        EXPECT_STREQ(open->task->currentPostprocessCommand().asString(),
+                     ("cat " + sound + " " + a + " " + sound + (all ? " " + b : "")).c_str());
+    }
+    state_.swapSegments(0, 1);
+    state_.removeSegment(2);
+    const auto single = restore(QvBatchTask::skipDisabled);
+    ASSERT_TRUE(single->task);
+    EXPECT_STREQ(single->task->currentPostprocessCommand().asString(),
+                 ("cat " + sound + " " + a + " " + sound).c_str());
 }
 
 // Files are open only while their segment is read.

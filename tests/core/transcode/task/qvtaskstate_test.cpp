@@ -105,6 +105,9 @@ TEST(QvTaskState, StreamsAndFilesAreFound) {
     EXPECT_EQ(state.source(Pair(2, 0), 1).filename(), "c");
     EXPECT_EQ(state.streamsForFile("a"), AnyVector(Any(Pair(1, 0)), Any(Pair(2, 0))));
     EXPECT_EQ(state.streamsForFile("b"), AnyVector(Any(Pair(4, 0))));
+    Any& sound = state.get("streams").asVector().at(1).asDict().get("sources").asVector().at(0);
+    sound.asDict().set("stream", Any(Pair(2, 3)));
+    EXPECT_EQ(state.streamsForFile("a"), AnyVector(Any(Pair(1, 0)), Any(Pair(2, 3)))) << "of the file";
 
     QvTaskState::Segment segment;
     std::vector<int> places;

@@ -53,7 +53,7 @@ TEST(TaskChecks, CodedSoundThatPassesThrough) {
         {coded, -16, false, -16, ""},
         {coded, 0, true, -11,
          "Not possible to use audio filters when both input and output audio formats are Dolby. "
-         "Please remove following filters: again"},
+         "Please remove following filters: again."},
     };
     FakePlugin plugin;
     plugin.audio("aquant").add(new QvAfModule);

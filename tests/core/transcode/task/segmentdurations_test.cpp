@@ -82,6 +82,18 @@ TEST(SegmentDurations, ASegmentHasAStreamThatEnds) {
         EXPECT_EQ(failureOf([&] { qvAdjustSegmentDurations(*list); }), "BatchTask.segmentAdjustDurations");
 }
 
+// A picture without frames leaves nothing of the others.
+TEST(SegmentDurations, NothingPlaysBesideAnEmptyPicture) {
+    File empty("a", 0, 48000), sameName("a", 25, 48000), other("b", 25, 48000);
+    std::vector<QvIStream> streams{
+        {&empty, 1, 0}, {&empty, 2, 0}, {&sameName, 2, 0}, {&other, 1, 0}, {&other, 2, 0}};
+    QvIStreamList list;
+    for (QvIStream& stream : streams) list.append(&stream);
+    EXPECT_EQ(qvAdjustSegmentDurations(list), 0);
+    for (const QvIStream& stream : streams)
+        EXPECT_EQ(stream.effectiveDuration().position(48000), 0) << qvStreamLabel(stream);
+}
+
 // Points of another timescale, negative ones, and what is no pair of times.
 TEST(SegmentDurations, StoredPointsAreUsableWhateverTheyAre) {
     File file("a", 100, 0);
