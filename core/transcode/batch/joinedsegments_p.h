@@ -54,7 +54,7 @@ class JoinedSegments {
     // What an encoder needs to take over coded frames of (type, stream); false unless every segment can give
     // it unconverted.
     bool smartParams(const Pair& address, AnyDict& out) const;
-    int frameTotal(int stream) const;  // at any time
+    int frameTotal(int stream) const;         // at any time
     long long sampleTotal(int stream) const;  // of the sources' sound
     // What reads give: where there is a picture, sound lasts as long as it does.
     long long soundTotal(int stream) const;

@@ -25,7 +25,8 @@ JobInput readInput(const Source& source) {
         const auto ask = [&](const char* name) { return decoder.getAudioParam(i, name).asInt32(0); };
         InputStream stream;
         stream.type = qvAudioStream;
-        stream.units = decoder.nrSamples(i);
+        // Of a join these are with the silence that fills segments.
+        stream.units = decoder.getAudioParam(i, "samples").asInt64(decoder.nrSamples(i));
         stream.sound = {ask("samplerate"), ask("channels"), ask("bitsPerSample")};
         input.audio.push_back(stream);
     }
