@@ -113,6 +113,7 @@ void JobRun::drive(JobTranscoder& transcoder) {
     if (result != 0 && result != QvStatus::endOfStream) throwRunFailure(parts_, transcoder, result);
     if (transcoder.filterFailure()) throw *transcoder.filterFailure();
     written_ = transcoder.written();
+    endedEarly_ = transcoder.endedEarly();
     addClipped(transcoder.clipped());
 }
 
@@ -145,6 +146,11 @@ void JobRun::checkAndCommit() {
     lengths_.check(!plan_.output.takesOneStream());
     warnings_.addEngine([this](const std::string& text) { return parts_.outputs.withFinalNames(text); });
     if (const std::string lost = Events::get().lost(); !lost.empty()) warnings_.add(lost);
+    if (endedEarly_) {
+        const std::string& name = plan_.input(*endedEarly_).name;
+        if (!options_.acceptPartial) throw failure(Msg::soundEndedEarly, {name});
+        warnings_.add(lineOf(Msg::soundPartlyRead, {name}));
+    }
     checkResult(parts_, written_, options_.acceptPartial, warnings_);
     stopIfSignalled();
     if (options_.strict) warnings_.refuse(options_.quiet, plan_.output.name);

@@ -37,5 +37,6 @@ class JobRun {
     Warnings& warnings_;
     Signals& signals_;
     Progress progress_;
-    std::vector<long long> written_;  // frames or samples of each stream
+    const PlannedStream* endedEarly_ = nullptr;  // see JobTranscoder
+    std::vector<long long> written_;             // frames or samples of each stream
 };

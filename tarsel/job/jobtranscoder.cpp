@@ -64,6 +64,9 @@ int JobTranscoder::cbMuxClose(QvMuxer*) {
             written_[i] = of->outProcessed();
             clipped_[i] = clippedBy(*of);
         }
+    for (const PlannedStream& stream : parts_.plan.streams)
+        if (const TransLink* of = linkOf(stream); of && of->endedEarly() && !endedEarly_)
+            endedEarly_ = &stream;
     takeFilterFailure();
     last_ = state("closing");
     phase_ = "closing";

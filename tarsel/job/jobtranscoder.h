@@ -36,6 +36,8 @@ class JobTranscoder : public QvTranscoder {
     const std::vector<long long>& written() const { return written_; }
     // Values that went beyond full scale in each stream of the plan.
     const std::vector<long long>& clipped() const { return clipped_; }
+    // The first stream whose sound ended before its source said; null for none.
+    const PlannedStream* endedEarly() const { return endedEarly_; }
     const std::optional<Failure>& filterFailure() const { return filterFailure_; }
     // Null for a stream that was not joined.
     const TransLink* linkOf(const PlannedStream& stream) const { return linkFor(stream); }
@@ -70,6 +72,7 @@ class JobTranscoder : public QvTranscoder {
     ProgressState last_;
     std::vector<long long> written_, clipped_;
     std::optional<Failure> filterFailure_;
+    const PlannedStream* endedEarly_ = nullptr;
     std::atomic<bool> stop_{false};
     std::mutex lock_;
     std::condition_variable changed_;

@@ -77,6 +77,18 @@ void checkTaken(const JobParts& parts, long long written) {
                       {parts.plan.output.name, std::to_string(taken), std::to_string(wanted)});
 }
 
+// In a join silence stands for what a sound lacks, so that the count is right all the same.
+void checkJoined(const JobParts& parts, bool acceptPartial, Warnings& warnings) {
+    if (!parts.stored || !parts.stored->isJoin()) return;
+    for (const auto& source : parts.sources) {
+        const Any ended = static_cast<const QvCodec&>(source->decoder()).getParam("endedEarly");
+        if (!ended.isVector() || ended.asVector().empty()) continue;
+        const std::string name = ended.asVector().at(0).toString().asString("");
+        if (!acceptPartial) throw failure(Msg::soundEndedEarly, {name});
+        warnings.add(lineOf(Msg::soundPartlyRead, {name}));
+    }
+}
+
 }  // namespace
 
 void checkResult(const JobParts& parts, const std::vector<long long>& written, bool acceptPartial,
@@ -95,6 +107,7 @@ void checkResult(const JobParts& parts, const std::vector<long long>& written, b
         if (!acceptPartial) throw failure(Msg::inputEndedEarly, {name, read, wanted, s.unit()});
         warnings.add(lineOf(Msg::inputPartlyRead, {name, read, wanted, s.unit()}));
     }
+    checkJoined(parts, acceptPartial, warnings);
     if (parts.outputs.files()) checkFiles(parts, written);
     if (plan.output.takesOneStream()) checkTaken(parts, written.front());
 }

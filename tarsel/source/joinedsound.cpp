@@ -87,6 +87,9 @@ int JoinedSound::readSamples(int count, int) {
         const int result = parts_[i].decoder->readSamples(count, parts_[i].stream);
         if (result < 0 && result != QvStatus::endOfStream)
             return setError(result, "%s", parts_[i].decoder->errorDesc());
+        const long long due = parts_[i].decoder->nrSamples(parts_[i].stream) - position_;
+        if (std::max(result, 0) < std::min<long long>(count, due))
+            return setError(QvStatus::failed, "a sound ended before its length");
         const QvPcm* in = parts_[i].decoder->getAudioPtr(parts_[i].stream);
         if (result < 1 || !in || in->samples() < 1) continue;
         const int got = std::min(count, in->samples()), from = in->bytesPerSample();

@@ -82,6 +82,8 @@ constexpr Message kMessages[] = {
     {Msg::taskWords,         Exit::usage, "{option}",                                 "it takes one task file",                                "give one"},
     {Msg::fileDamaged,       Exit::input, "{file} is damaged",                      "{text}",                                                "copy or make it again"},
     {Msg::inputEndedEarly,   Exit::input, "{file} ended early",                     "{text} of {text} {text} were read",                     "--accept-partial keeps what is there"},
+    {Msg::soundEndedEarly,   Exit::input, "{file} ended early",                     "not all of its sound was read",                         "--accept-partial keeps what is there"},
+    {Msg::soundPartlyRead,   Exit::done,  "{file} ended early",                     "not all of its sound was read",                         "silence is in the place of the rest"},
     {Msg::inputDamagedTaken, Exit::done,  "{file} is damaged",                      "{text}",                                                "the part that can be read is used"},
     {Msg::inputPartlyRead,   Exit::done,  "{file} ended early",                     "{text} of {text} {text} were read",                     "the output holds these"},
     {Msg::inputClipped,      Exit::done,  "{file} goes beyond full scale",          "{text} samples of audio stream {text} were clipped",    "lower its level where it is made"},

@@ -82,6 +82,8 @@ enum class Msg : unsigned short {
     taskWords,
     fileDamaged,
     inputEndedEarly,
+    soundEndedEarly,
+    soundPartlyRead,
     inputDamagedTaken,
     inputPartlyRead,
     inputClipped,

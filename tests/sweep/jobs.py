@@ -51,6 +51,8 @@ JOBS = [
         card("--pixel", "I420", "--filter", "rawdump:filename=dump", "-o", "dumped.yuv", length=0.28)),
     Job("logo", card("--logo", "shown#9.png@4,4", "--save-task", "shown.xml", "--relative", "-o", "shown.png"),
         card("--logo", "shown#9.png@0,0", "--save-task", "shown.xml", "--relative", "-o", "shown.png", length=0.28, size="48x64")),
+    Job("beside", ["transcode", *CLIP, "in.wav", "--to", "0.06", "-o", "pair.yuv", "-y"],
+        ["transcode", *CLIP, "in3.wav", "--from", "0.1", "-o", "pair.yuv", "-y"]),
     Job("join", ["transcode", "--join", "clip.yuv@0-0.2", "in.wav", "clip.yuv+in.wav@0.2-0.4", *RAW, "--fade", "2f",
                  "--subtitles", "talk.srt", "--save-task", "joined.xml", "--relative", "-o", "joined.yuv", "-y"],
         ["transcode", *CLIP, "--cut", "0-0.2", "--cut", "0.4-0.5", "--save-task", "joined.xml", "--relative",

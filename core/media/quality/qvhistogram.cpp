@@ -58,12 +58,13 @@ void drawLine(QvFrame& out, int left, int width, int row) {
 void drawWave(const SampleView& view, QvFrame& out, int left, int full) {
     const Range range = rangeOf(view);
     const Colour colour = colourOf(view.name);
-    std::vector<int> counts(static_cast<std::size_t>(view.width) * waveRows);
+    const auto columns = static_cast<std::size_t>(view.width);
+    std::vector<int> counts(columns * waveRows);
     for (int y = 0; y < view.height; ++y) {
         const unsigned char* const row = view.row(y);
         for (int x = 0; x < view.width; ++x)
-            ++counts[static_cast<std::size_t>(levelAt(view, row, x) * waveRows / range.levels * view.width +
-                                              x)];
+            ++counts[static_cast<std::size_t>(levelAt(view, row, x) * waveRows / range.levels) * columns +
+                     static_cast<std::size_t>(x)];
     }
     drawLine(out, left, view.width, waveRows - 1 - range.lowest * waveRows / range.levels);
     drawLine(out, left, view.width, waveRows - 1 - range.highest * waveRows / range.levels);
@@ -71,7 +72,7 @@ void drawWave(const SampleView& view, QvFrame& out, int left, int full) {
     for (int level = 0; level < waveRows; ++level) {
         unsigned char* to = out.pixelPtr(left, waveRows - 1 - level);
         for (int x = 0; x < view.width; ++x, to += 3) {
-            const int count = counts[static_cast<std::size_t>(level * view.width + x)];
+            const int count = counts[static_cast<std::size_t>(level) * columns + static_cast<std::size_t>(x)];
             if (count == 0) continue;
             // The root keeps single samples visible.
             const double weight = std::sqrt(std::min(1.0, static_cast<double>(count) / whole));

@@ -12,6 +12,8 @@ int BoundedSound::readSamples(int count, int) {
     if (result < 0 && result != QvStatus::endOfStream) return setError(result, "%s", source_.errorDesc());
     const QvPcm* pcm = source_.getAudioPtr(number_);
     const int samples = pcm && pcm->inited() ? pcm->samples() : 0;
+    if (samples < std::min<long long>(most, available_)) endedEarly_ = true;
+    available_ -= samples;
     if (left_ != unbounded) left_ -= std::min<long long>(samples, left_);
     return result;
 }

@@ -12,6 +12,12 @@ class BoundedSound : public QvDecodePipe {
 
     BoundedSound(QvDecodePipe& source, int number) : source_(source), number_(number) {}
     void setLeft(long long samples) { left_ = samples; }  // that can still be read
+    // What the source says that it still has. A read that gives less is a source that ended early.
+    void setAvailable(long long samples) {
+        available_ = samples;
+        endedEarly_ = false;
+    }
+    bool endedEarly() const { return endedEarly_; }
 
     int setParam(const char* name, const Any& value) override { return source_.setParam(name, value); }
     int nrStreams(int type) const override { return source_.nrStreams(type); }
@@ -36,5 +42,7 @@ class BoundedSound : public QvDecodePipe {
     QvDecodePipe& source_;
     int number_;
     long long left_ = unbounded;
+    long long available_ = 0;
+    bool endedEarly_ = false;
     bool atEnd_ = false;  // nothing was read, so the source's buffer is an old one
 };

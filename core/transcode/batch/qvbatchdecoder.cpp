@@ -152,6 +152,12 @@ void QvBatchDecoder::getParam(const char* name, Any& value) const {
             return std::any_of(segment.videos.begin(), segment.videos.end(), says) ||
                    std::any_of(segment.audios.begin(), segment.audios.end(), says);
         });
+    } else if (std::strcmp(name, "endedEarly") == 0) {
+        AnyVector names;
+        for (const BatchSegment& segment : p_->segments)
+            for (const auto& audio : segment.audios)
+                if (audio->endedEarly()) names.append(audio->input().filename());
+        value = names;
     } else if (std::strcmp(name, "srParams") == 0) {
         AnyDict params;
         if (value.isPair() && p_->smartParams(value.asPair(), params))

@@ -11,6 +11,9 @@
 // filled up with silence. Without video the sound does. nrSamples() counts what the sources have, a stream's
 // "samples" what reads give. After the last segment every read gives -4 (QvStatus::endOfStream).
 //
+// The parameter "endedEarly" is a Vector of the names of inputs whose sound ended before they said it does;
+// what they lack was filled with silence.
+//
 // The decoders belong to the caller and outlive this one. They hold no file and no codec before their segment
 // is near, if they can do without (see QvDecodePipe). One thread at a time.
 #pragma once

@@ -132,6 +132,7 @@ int SegmentAudio::start(bool bounded, std::string& why) {
     if (result != QvStatus::ok && !ended_) return failedWith(result, decoder, why);
     const long long first = from.position(samplerate_);
     const long long end = (span_.out + delay_).position(samplerate_);
+    sound_.setAvailable(decoder.nrSamples(input_.number) - first);
     sound_.setLeft(bounded ? std::max(end - first, 0LL) : BoundedSound::unbounded);
     if (!converts_ || ended_) return QvStatus::ok;
     if (pipe_)

@@ -32,6 +32,8 @@ class SegmentAudio {
     int stop(std::string& why);
 
     bool ended() const { return ended_; }
+    // The source gave less than it said that it has, so there was silence too early.
+    bool endedEarly() const { return sound_.endedEarly(); }
     void end() { ended_ = true; }
     long long samplesRead() const { return samplesRead_; }  // since start, silence included
     void count(int samples) { samplesRead_ += samples; }

@@ -46,6 +46,9 @@ class QV_API TransLink {
     // when it failed before the expected end.
     virtual int processFrame(int n) = 0;
     virtual bool finished() const { return finished_; }
+    // Whether the sound of a run ended, by a fault or a lack of data, before what its source announced. There
+    // is silence in the place of the rest, so the count does not show it.
+    virtual bool endedEarly() const { return false; }
     virtual int totalOutFrames() const = 0;  // video only
     virtual double samplesPerFrame() const;
     virtual double completed() const = 0;  // percent

@@ -28,7 +28,7 @@ EffectOptions leadingTo(const PictureFormat& format, const PictureFormat& from,
 
 FilterPlanner::FilterPlanner(JobPlan& plan, const EffectOptions& options,
                              const std::vector<PictureFormat>& known)
-    : plan_(plan), options_(options) {
+    : plan_(plan) {
     for (PlannedStream& stream : plan.streams) {
         if (!stream.isVideo()) continue;
         const auto number = static_cast<size_t>(stream.number);

@@ -26,7 +26,6 @@ class FilterPlanner {
     void planPicture(PlannedStream& stream);
 
     JobPlan& plan_;
-    const EffectOptions& options_;
     std::list<EffectOptions> towards_;      // those that lead to known formats
     std::vector<PictureEffects> pictures_;  // of the video streams, by their numbers
 };

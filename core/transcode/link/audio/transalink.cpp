@@ -86,6 +86,7 @@ int TransALink::openWith(const LinkOpen& given) {
     audioPipe_.reset();
     smartRendering_ = false;
     padsEnd_ = given.conversion.padEnd;
+    endedEarly_ = false;
     readLogProgress();
     if (given.frameNumbers) QV_FAIL("startFrame and stopFrame are deprecated. Use 'inOutPoints'.");
     AnyDict stream;
@@ -321,7 +322,11 @@ int TransALink::directStep(int n) {
     const bool isSound = read >= 0 || read == QvStatus::endOfStream;
     if (read < n) {
         finished_ = true;
-        if (!worked_ && !(padsEnd_ && isSound)) return readFailed();
+        if (!isSound) {
+            endedEarly_ = true;
+            padsEnd_ = false;  // what has failed is not asked again
+        }
+        if (!worked_ && !padsEnd_) return readFailed();
     }
     int result = QvStatus::ok;
     const bool holds = pcm && pcm->inited() && pcm->samples() > 0;
@@ -332,6 +337,7 @@ int TransALink::directStep(int n) {
         QV_STEP_LOG("ALink", "writePcm done result=%d", result);
         clock_->wrote(pcm->samples());
     }
+    if (finished_ && !clock_->complete()) endedEarly_ = true;
     if (padsEnd_ && result == QvStatus::ok)
         result = fillStep(n - static_cast<int>(clock_->written() - before));
     return endStep(result);
@@ -348,6 +354,7 @@ int TransALink::pipeStep(int n) {
     if (processed != QvStatus::ok && !padded) {
         finished_ = true;
         padsEnd_ = false;  // what has failed is not asked again
+        if (processed != QvStatus::endOfStream) endedEarly_ = true;
         if (!worked_) return readFailed();
     }
     auto* pcm = audioPipe_->pcm();

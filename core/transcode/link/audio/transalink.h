@@ -33,6 +33,7 @@ class QV_API TransALink : public TransLink {
     QvCodec* filter(const char* name, int index) const override;
 
     long long totalOutSamples() const override;
+    bool endedEarly() const override { return endedEarly_; }
 
     // Writes n samples of silence. 0, whatever the writer says.
     virtual int _insertSilence(int n);
@@ -83,6 +84,7 @@ class QV_API TransALink : public TransLink {
     QvPcm silence_;
     int steps_ = 0;  // that did work
     bool smartRendering_ = false;
+    bool endedEarly_ = false;
     bool padsEnd_ = false;      // AudioConversion::padEnd
     bool wasFinished_ = false;  // before the last step
 };
