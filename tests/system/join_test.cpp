@@ -12,7 +12,6 @@ using testing::Not;
 constexpr int kWidth = 32, kHeight = 32;
 constexpr std::size_t kFrameBytes = kWidth * kHeight * 3 / 2;
 const Words kRaw = {"--raw", "size=32x32,pixel=I420,rate=30000/1001"};
-constexpr double kRate = 30000.0 / 1001.0;
 constexpr long long kFrames = 200, kSamples = 300000;  // of the inputs
 
 // Frame n is filled with a level of its own, and sample n has a value of its own in both channels.
@@ -83,8 +82,9 @@ TEST_F(Join, EachSeamIsExact) {
         Model model;
         const int segments = 1 + static_cast<int>(random() % 5);
         for (int i = 0; i < segments; ++i) {
-            const long long from = random() % (kFrames - 1);
-            const long long to = from + 1 + random() % std::min(kFrames - from, 40LL);
+            const auto from = static_cast<long long>(random() % (kFrames - 1));
+            const auto most = static_cast<unsigned>(std::min(kFrames - from, 40LL));
+            const long long to = from + 1 + static_cast<long long>(random() % most);
             job = job + (cuts ? Words{"--cut", frames(from, to)} : Words{"p.yuv+s.wav@" + frames(from, to)});
             model.addFrames(from, to - 1);
         }
