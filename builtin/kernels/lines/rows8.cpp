@@ -89,7 +89,7 @@ void join3(Byte* to, const Byte* a, const Byte* b, const Byte* c, size_t n) {
     }
 }
 
-// Pixels of three bytes are moved in blocks of 16 bytes, of which 12 count; what lies behind them is written
+// Pixels of three bytes are moved in blocks of 16 bytes, of which 12 count; what comes after them is written
 // next, so all but the last blocks of a line go this way.
 #if QV_VECTORS
 const hn::Full128<uint8_t> block8;
@@ -99,7 +99,7 @@ alignas(16) constexpr Byte fourth[16] = {0, 0, 0, 255, 0, 0, 0, 255, 0, 0, 0, 25
 #endif
 
 // In place the blocks' spare bytes would be read later: source and target of a line differ then, as the
-// target is behind the source.
+// target comes after the source.
 void pack4to3(Byte* to, const Byte* from, size_t n) {
     size_t i = 0;
 #if QV_VECTORS

@@ -131,7 +131,7 @@ struct ToPlanes {
 
 #if QV_WIDE
 // A picture is written once, in order: asking for its memory a little before it is written keeps more of it
-// under way than the processor does by itself. Addresses behind the picture do no harm.
+// under way than the processor does by itself. Addresses past the picture do no harm.
 HWY_INLINE void soonWritten(const Byte* to, size_t bytes) {
     constexpr size_t cacheLine = 64, ahead = 2048;
     for (size_t i = 0; i < bytes; i += cacheLine) __builtin_prefetch(to + ahead + i, 1);

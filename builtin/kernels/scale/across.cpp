@@ -10,7 +10,7 @@ namespace {
 
 constexpr int block = 8;
 
-// The sample of a block that stands in for those behind the end of the line.
+// The sample of a block that stands in for those past the end of the line.
 int sampleOf(const Axis& axis, int i) { return std::min(i, axis.target - 1); }
 
 const int16_t* weightsOf(const Axis& axis, int i) {

@@ -37,7 +37,7 @@ struct Across {
 };
 Across makeAcross(const Axis& axis);
 
-// Lines that the pass across reads have this many bytes more before and behind, which repeat the ends.
+// Lines that the pass across reads have this many bytes more before and after, which repeat the ends.
 constexpr int beforeLine = maxTaps + 16;
 constexpr int behindLine = maxTaps + 48;
 // Words are written in whole vectors: a line of them has room for this many, and a multiple of it.

@@ -42,7 +42,7 @@ class OpenDecoders {
 
 // Answers what is known of the source without opening it. The first read opens the source, with the streams
 // that are selected at the positions that were sought; when it is closed to make room, its positions are kept
-// and the next read goes on from there. Whatever changes the source, as setParam, opens it for good.
+// and the next read begins there. Whatever changes the source, as setParam, opens it for good.
 class LazyDecoder : public QvDecodePipe {
   public:
     using Opener = std::function<QvDecodePipe*()>;  // an open decoder for the caller, null when it fails

@@ -44,7 +44,7 @@ class QV_API QvPushEncoder {
     int setEncoder(QvEncodePipe* encoder);
     // "bufferLength" (optional) frames are ready at first, 4 by default; "frames" (optional) ends the stream
     // after so many. Of `process`, which may be null, the filters are used. QvStatus::failed for a format
-    // that is none, QvStatus::outOfMemory; nothing is added then.
+    // that is impossible, QvStatus::outOfMemory; nothing is added then.
     int addVideoStream(AnyDict& params, ProcessParams* process);
     // "bufferLength" (optional) samples fit at first, 48000 by default; "bytesPerSample" or "bitsPerSample"
     // may be left out. Rates up to 96000, 8, 16, 20, 24 or 32 bits. Of `process` the filters and the channel

@@ -42,7 +42,7 @@ class StoredTask {
     // After open. The sources are the decoders of the task's links, each once.
     QvTask& task() const { return *task_; }
     std::vector<std::unique_ptr<Source>> sources() const;
-    // Once; the task goes on using it.
+    // To be called once. The task still uses it, so it has to outlive the task's runs.
     std::unique_ptr<QvEncodePipe> takePipe() { return std::move(pipe_); }
 
   private:
