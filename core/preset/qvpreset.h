@@ -15,11 +15,16 @@
 #include "core/value/any.h"
 #include "core/value/anycontainer.h"
 
+class QvEncodePipe;
+
 class QV_API QvPreset : public AnyDict {
   public:
     QvPreset();                               // a user preset without profile, named "<invalid>"
     QvPreset(int profile, const char* name);  // a user preset
     explicit QvPreset(const AnyDict& dict);   // completes what `dict` lacks
+    // A user preset that holds what the pipe is set to now, with its "info" made. Neither pipe nor name may
+    // be null (assertions). The third argument is not used.
+    QvPreset(const QvEncodePipe* pipe, const char* name, bool = false);
 
     bool isCustom() const { return get("custom").isTrue(); }
     bool isBuiltin() const { return !isCustom(); }
@@ -38,6 +43,20 @@ class QV_API QvPreset : public AnyDict {
     AnyDict muxerParams() const;
     AnyVector programs() const;
     std::optional<QvPresetMeta> presetMeta() const;  // "PresetMeta", if it is there
+
+    // Whether an encode pipe takes this preset here: tried once, on a pipe of its own, and kept as the marks
+    // "#valid" and "#err". A dictionary without "profile", "custom" or "name" is an assertion. error() is the
+    // reason, invalid for a valid preset or one that was not tried.
+    bool isValid();
+    bool checkValid();  // tries again
+    const Any& error() const { return get("#err"); }
+    // Sets "info" to a line about format, video and sound, unless it holds a text already. It is read from
+    // `pipe`, to which this preset was applied, or from a pipe of its own.
+    void createInfo(const QvEncodePipe* pipe = nullptr);
+
+    // A copy whose profile, and that of its streams and multiplexer, is QvProfile::none. A stream of another
+    // profile is an assertion. A built-in preset is an assertion too, and comes back as it is.
+    QvPreset toNone(int = 0) const;
 
     // The modules that are allowed, by way of the base preset for a user's; empty when that is missing.
     AnyVector muxers() const { return allowed("muxers"); }

@@ -6,7 +6,10 @@
 #include <memory>
 
 #include "core/arch/api.h"
+#include "core/preset/presetgroup.h"
 #include "core/preset/qvpreset.h"
+
+class CodecCompat;
 
 class QV_API QvPresetMgr {
   public:
@@ -15,8 +18,26 @@ class QV_API QvPresetMgr {
     QvPresetMgr(const QvPresetMgr&) = delete;
     QvPresetMgr& operator=(const QvPresetMgr&) = delete;
 
+    // The presets for which modules are installed: those of this library, then those that plug-ins name.
     const QvPresetList& builtinPresets() const;
     QvPreset builtinPreset(int index) const;
+    const PresetGroupList& builtinGroups() const;
+
+    // The built-in presets and groups, followed by those presets of the extended source that rest on a
+    // built-in one, have a name of their own and a group. A built-in preset has the same index in both lists.
+    const QvPresetList& extendedPresets() const;
+    QvPreset extendedPreset(int index) const;
+    const PresetGroupList& extendedGroups() const;
+
+    // Fills the extended source from a file of user presets: 0, or the reader's result, which changes
+    // nothing.
+    int loadExtendedPresets(const Any& source);
+    void clearExtendedPresets();
+
+    // The presets of this library that are not here because no module makes their video, or no multiplexer
+    // takes it. Each is a dictionary: "profile", "name", "group" (a name) and "waitsFor", a vector of the
+    // names of the modules one of which would bring it.
+    AnyVector missingPresets() const;
 
     // Index of the built-in preset of a profile (of any scheme), -1 if there is none. Asserts before update.
     int findByProfile(int profile) const;
@@ -33,6 +54,9 @@ class QV_API QvPresetMgr {
 
     // Builds everything anew from the modules that are installed now.
     void update();
+
+  protected:
+    const CodecCompat& compatList() const;
 
   private:
     struct Private;
