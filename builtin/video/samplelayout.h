@@ -25,7 +25,7 @@ struct SampleLayout {
     Store store;
     uint8_t bits;                      // of a sample; the green of R565 has one more
     uint8_t perPixel;                  // samples of plane 0 for each pixel
-    std::array<SampleRole, 4> first4;  // of a row of plane 0; it goes on in this way. Other planes are chroma
+    std::array<SampleRole, 4> first4;  // of a row of plane 0, over and over. Other planes are chroma
 
     SampleRole role(int plane, size_t sample) const {
         return plane ? SampleRole::chroma : first4[sample & 3];

@@ -10,8 +10,8 @@
 #include <utility>
 
 // It runs while an exception is on its way, often for want of memory, so the action should not take any. If
-// it does and gets none, the first exception goes on: what the action did not reach is left to the
-// destructors. Any other exception from it ends the program.
+// it does and gets none, the first exception stays the one that is thrown, and what the action did not reach
+// is left to the destructors. Any other exception from it ends the program.
 template <class Action>
 class Undo {
   public:

@@ -32,7 +32,7 @@ struct Search {
         line = static_cast<int>(XML_GetCurrentLineNumber(parser));
         XML_StopParser(parser, XML_FALSE);
     }
-    // The way can't go on once one of its elements has ended.
+    // Nothing more is to be found once an element of the way has ended.
     void end() {
         if (depth-- == reached) XML_StopParser(parser, XML_FALSE);
     }

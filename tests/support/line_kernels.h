@@ -1,6 +1,6 @@
 // Line kernels on every vector unit of the machine, compared with the plain loops byte for byte: lines of any
-// length at any place, in place where that is allowed, with bytes before and behind that must stay and a page
-// without access behind.
+// length at any place, in place where that is allowed, with bytes before and after that must stay and a page
+// without access after those.
 #pragma once
 
 #include <gtest/gtest.h>
@@ -80,7 +80,7 @@ auto checked(Run run, Formula formula) {
     };
 }
 
-// What is in the lines behind a run.
+// What is in the lines after a run.
 inline std::string linesBehind(const LineKernel& kernel, size_t n, size_t gap, bool inPlace, int64_t target) {
     static Guarded memory[12];
     LineCase lines{{}, {}, n};

@@ -16,8 +16,8 @@ constexpr bool isDeep(Core core) {
     return core == Core::rgb16 || core == Core::video16 || core == Core::yuv16;
 }
 
-// Lines that are copied or shuffled as they stand (`packed8`, `lines`) serve where nothing is scaled and no
-// matrix changes.
+// Paths that copy or shuffle lines (`packed8`, `lines`) are for conversions without scaling and without a
+// change of matrix.
 enum class Use : uint8_t { plain, scaling };
 
 struct Path {

@@ -50,7 +50,7 @@ void twice(Byte* to, const Byte* from, size_t n);
 // Every second sample, from the first on: n of 2 * n.
 void evens(Byte* to, const Byte* from, size_t n);
 // Linear interpolation, rounded to the nearest, between chroma samples that lie on every second pixel: `n`
-// pixels from n / 2 samples; the last one goes on.
+// pixels from n / 2 samples; after the last sample its value is repeated.
 void doubleLine(Byte* to, const Byte* from, size_t n);
 
 const char* rows8Unit();  // which unit runs, as in "AVX2"

@@ -179,8 +179,7 @@ std::FILE* openStream(const char* name, const std::shared_ptr<QvCancel>& cancel)
     std::FILE* const file = fopencookie(output.get(), "w", {nullptr, writeStream, nullptr, closeStream});
     if (!file) return nullptr;
     output.release();
-    // Each write goes on as it is: what the C library kept back would be written by fclose, after a failure
-    // too.
+    // No buffer: what the C library kept back would be written by fclose, after a failure too.
     std::setvbuf(file, nullptr, _IONBF, 0);
     return file;
 }

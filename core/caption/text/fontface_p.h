@@ -22,7 +22,7 @@ struct FontGlyph {
     std::vector<unsigned char> coverage;  // width * rows, 0 to 255
 };
 
-// FreeType goes on without what it finds no memory for, and would leave letters out; where it makes the
+// FreeType leaves out what it finds no memory for, so letters would be missing; where it makes the
 // interpreter of a face's hints, version 2.12 writes through the null pointer. So it gets memory that keeps
 // in mind whether it ran out, and that has a reserve for the interpreters of three faces.
 class FontLibrary {

@@ -38,7 +38,7 @@ constexpr int audioPipe = 16;  // its codecs answer getInterface(13)
 class QV_API QvModule {
   public:
     QvModule() = default;  // no attributes, name "<unnamed>", description ""
-    // Logs how many codecs are still alive; these go on as codecs without a module.
+    // Logs how many codecs are still alive; these live on as codecs without a module.
     virtual ~QvModule();
     // Makes a codec, which the caller owns, or null. QvRegistry::newCodec calls this and then its init().
     virtual QvCodec* create() = 0;

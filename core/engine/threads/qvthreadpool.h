@@ -20,8 +20,8 @@ class QV_API QvThreadPool {
     // Calls `task(i)` once for each i from 0 up to but not including `count`, in any order, on the workers
     // and on the caller, and returns when all calls have returned; what they wrote is then visible to the
     // caller. Allocates nothing. A task may itself call parallelFor, on this pool or another. Several threads
-    // may call at once. If tasks throw, indices not begun yet are left out and the first exception goes on to
-    // the caller.
+    // may call at once. If tasks throw, indices not begun yet are left out and the first exception is thrown
+    // again to the caller.
     template <class Task>
     void parallelFor(int count, Task&& task) {
         using Plain = std::remove_reference_t<Task>;

@@ -7,10 +7,9 @@
 class FrameWindow {
   public:
     // The next number, the picture of `source`, its rate and its metadata. The source outlives the use of
-    // the window. 0, QvStatus::failed for an empty
-    // source, QvStatus::outOfMemory.
+    // the window. 0, QvStatus::failed for an empty source, QvStatus::outOfMemory.
     int show(QvFrame& source);
-    // The source is about to go; numbers go on.
+    // The source is about to be destroyed. Numbers continue after it.
     void forget() { frame_.destroy(); }
     void restart();  // the next number is 0
 

@@ -18,7 +18,7 @@ TEST(Undo, RunsUnlessItIsDismissed) {
     EXPECT_EQ(undone, 1);
 }
 
-// The exception that it meets goes on.
+// The exception that was on its way is the one that is thrown.
 TEST(Undo, GetsByWithoutMemory) {
     const auto without = [] { throw std::bad_alloc(); };
     EXPECT_THROW(
