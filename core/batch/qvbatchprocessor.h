@@ -1,0 +1,89 @@
+// Runs the tasks of a list one after the other, on a thread of its own or on the caller's. A task that fails
+// does not end the run.
+//
+//     QvBatchProcessor processor;
+//     processor.init(list);               // the list stays the caller's and outlives the run
+//     processor.start(false, &callback);  // returns when the worker has begun
+//     ...
+//     processor.stop();                   // returns when it has ended
+//
+// start, stop, pause, unpause and the queries may be called from any thread but that of the callbacks (stop
+// there would wait for itself); the queries also from there.
+#pragma once
+
+#include <memory>
+
+#include "core/arch/api.h"
+#include "core/batch/qvbatchlist.h"
+
+// All calls come from the thread that runs the tasks. Results are not used.
+class QV_API QvBatchProcessCb {
+  public:
+    enum TaskCode { taskDone = 0, nothingToDo = 1, taskAborted = 2, taskFailed = -1 };
+    enum SegmentStatus { segmentOpened = 0, segmentDisabled = 1, segmentFailed = -1 };
+
+    virtual ~QvBatchProcessCb() = default;
+    virtual int reserved1() { return 0; }
+    virtual int reserved2() { return 0; }
+    virtual int reserved3() { return 0; }
+
+    virtual int batchStarted() { return 0; }
+    virtual int batchFinished() { return 0; }
+    virtual int taskStarted(int task);
+    // Once for each task that was started. `info` may hold "msg", a text.
+    virtual int taskFinished(int task, int code, const AnyDict& info);
+    virtual int taskSkipped(int task);  // it is disabled
+    // After a task was restored, for each of its segments.
+    virtual int segmentInitStatus(int task, int segment, int status);
+    virtual int segmentStarted(int task, int segment);
+    virtual int segmentFinished(int task, int segment, int code, const AnyDict& info);
+    virtual int progress(int task, int segment, const AnyDict& info);  // "percent", 0.0 to 1.0 of the task
+    virtual int batchPaused(bool paused);                              // a pause took effect, or has ended
+};
+
+class QV_API QvBatchProcessor {
+  public:
+    QvBatchProcessor();
+    QvBatchProcessor(const QvBatchProcessor&) = delete;
+    QvBatchProcessor& operator=(const QvBatchProcessor&) = delete;
+    virtual ~QvBatchProcessor();  // ends a run first
+
+    // Takes the tasks of a list. The list itself is not copied for running: it must live, and keep its tasks
+    // where they are, until the run has ended. An assertion while running.
+    virtual int init(QvBatchList& list);
+    // synchronous: runs on this thread and returns when all is done. Otherwise a callback is required
+    // (assertion) and the result says whether the thread began. An assertion while running.
+    virtual int start(bool synchronous, QvBatchProcessCb* callback);
+    // Ends the run after the round of work that is under way; the task gets QvBatchProcessCb::taskAborted.
+    // Returns when the run has ended, unless it is synchronous.
+    virtual int stop();
+    // Take effect within a task, at its next round of work, or between two tasks: the task that was due then
+    // is left out. Assertions in a synchronous run.
+    virtual int pause();
+    virtual int unpause();
+    // What the worker runs. 0.
+    virtual int run();
+
+    void setSmartRender(bool on);
+    bool smartRender() const;
+    // Bits of QvBatchTask; 3 at first, which leaves out disabled and failed segments. Bit 0 also leaves out
+    // disabled tasks. Not while running (assertion).
+    void setOptions(int options);
+    int options() const;
+
+    bool isInitialized() const;
+    bool isRunning() const;
+    bool isPaused() const;  // a pause has taken effect
+    int currentTask() const;
+    int currentSegment() const;  // with disabled segments counted
+    // Of the last failure; the text is a copy, so that it may be asked for during a run.
+    int errorCode() const;
+    int getErrorCode() const { return errorCode(); }
+    Any errorDesc() const;
+    Any getErrorDesc() const { return errorDesc(); }
+    void setError(int code, const char* format, ...) __attribute__((format(printf, 3, 4)));
+
+  private:
+    struct Private;
+    std::unique_ptr<Private> p_;
+};
