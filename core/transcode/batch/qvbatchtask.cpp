@@ -6,6 +6,7 @@
 #include <utility>
 
 #include "core/arch/qvassert.h"
+#include "core/arch/undo_p.h"
 #include "core/encode/qvencodepipe.h"
 #include "core/engine/log/qvlog.h"
 #include "core/engine/status.h"
@@ -25,6 +26,19 @@ QvIStreamList fedStreams(const QvInputSegment& segment) {
     for (const auto& stream : segment.streams)
         if (stream->decoder) list.append(stream.get());
     return list;
+}
+
+// Decoders that find no place in the list are deleted, as nobody else knows them.
+void keepAll(QvDPipeList& list, const QvDPipeList& decoders) {
+    int kept = 0;
+    Undo deleting([&] {
+        for (int i = kept; i < decoders.size(); ++i) delete decoders[i];
+    });
+    for (QvDecodePipe* decoder : decoders) {
+        list.append(decoder);
+        ++kept;
+    }
+    deleting.dismiss();
 }
 
 }  // namespace
@@ -84,8 +98,8 @@ int QvBatchTask::openFiles(const QvTaskState& state, int options, QvFileOpenCb* 
         std::string error;
         const int result = inputs.open(i, segment, error);
         if (result == QvStatus::ok) {
+            keepAll(opened, segment.decoders);
             segment.status = QvInputSegment::opened;
-            for (QvDecodePipe* decoder : segment.decoders) opened.append(decoder);
             ++open;
             continue;
         }
@@ -214,9 +228,11 @@ int QvBatchTask::restore(const QvTaskState& state, QvDPipeList& decoders, QvEnco
         QV_ASSERT_MSG(place >= 0, "BatchTask.restore: invalid condition, no valid segment(s) found.");
         linkSegment(segment(place));
     }
-    for (QvDecodePipe* decoder : made.decoders) decoders.append(decoder);
+    QvDPipeList all = decoders;
+    for (QvDecodePipe* decoder : made.decoders) all.append(decoder);
     setPostprocessCommand(state.postprocessCommand());
     QvEncodePipe* const pipe = made.keep();
+    decoders = std::move(all);  // who is given both would delete what a failed attempt has deleted
     if (encoderOut) *encoderOut = pipe;
     return QvStatus::ok;
 }

@@ -1,10 +1,14 @@
 // Each allocation that a task file's check or opening takes fails in turn, alone or with all later ones:
 // there is a fault, no exception, and nothing that was made.
+#include "core/arch/qvexception.h"
 #include "core/decode/qvdecoder.h"
+#include "core/document/xmldom.h"
 #include "core/engine/status.h"
 #include "core/media/qvuserdata.h"
 #include "core/transcode/batch/qvbatchdecoder.h"
+#include "core/transcode/batch/qvbatchtask.h"
 #include "core/transcode/batch/qvtaskfile.h"
+#include "core/transcode/task/qvtaskstate.h"
 #include "core/transcode/task/qvtranscodetask.h"
 #include "tests/core/transcode/batch/soundtask.h"
 #include "tests/support/engine.h"
@@ -45,6 +49,34 @@ TEST(QvTaskFileWithoutMemory, GivesAFaultAndLeavesNothing) {
             decoders.deleteAll();
         }
         EXPECT_GT(nth, 100);
+    }
+}
+
+// The last allocations are those of the lists in which decoders are handed over.
+TEST(QvBatchTaskWithoutMemory, HandsOverAllDecodersOrNone) {
+    const TaskFile file;
+    AnyDict stored;
+    Any root, version;
+    ASSERT_EQ(XmlParser::restoreDict(file.name.c_str(), stored, root, version), 0);
+    const QvTaskState state(stored);
+    int nth = 0;
+    for (bool done = false; !done; ++nth) {
+        QvDPipeList decoders;
+        std::unique_ptr<QvTask> task;
+        QvEncodePipe* pipe = nullptr;
+        {
+            const FailingMemory memory(nth + 1);
+            try {
+                task.reset(QvBatchTask::fromState(state, decoders, &pipe, 0));
+            } catch (const QvException&) {
+            } catch (const std::bad_alloc&) {
+            }
+            done = !FailingMemory::failed();
+        }
+        const std::unique_ptr<QvEncodePipe> owned(pipe);
+        ASSERT_EQ(decoders.size(), task ? 2 : 0) << nth;
+        task.reset();
+        decoders.deleteAll();
     }
 }
 
