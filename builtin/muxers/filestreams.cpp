@@ -2,7 +2,6 @@
 
 #include <algorithm>
 #include <cstring>
-#include <limits>
 #include <memory>
 #include <vector>
 
@@ -212,7 +211,6 @@ class FileMultiplexer {
     int checkNames();
     int feed();
     int fail(std::size_t index, const std::string& why);
-    bool exceeds(std::size_t index) const;
 };
 
 int FileMultiplexer::fail(std::size_t index, const std::string& why) {
@@ -221,20 +219,9 @@ int FileMultiplexer::fail(std::size_t index, const std::string& why) {
     return QvStatus::failed;
 }
 
-// More streams than the multiplexer says that it takes.
-bool FileMultiplexer::exceeds(std::size_t index) const {
-    const Any limits = muxer_.getParam("maxStreams");
-    if (!limits.isDict()) return false;
-    const int type = config_.streams[index].type;
-    const char* key = type == qvVideoStream ? "vids" : type == qvAudioStream ? "auds" : "subs";
-    return muxer_.nrStreams(type) >= limits.asDict().getInt32(key, std::numeric_limits<int>::max()) ||
-           muxer_.nrStreams(0) >= limits.asDict().getInt32("total", std::numeric_limits<int>::max());
-}
-
 int FileMultiplexer::begin() {
     for (std::size_t i = 0; i < config_.streams.size(); ++i) {
         const QvFileMuxStream& stream = config_.streams[i];
-        if (exceeds(i)) return fail(i, std::string(muxer_.name()) + " takes no further stream of this type");
         feeds_.push_back(
             std::make_unique<FileFeed>(stream, qv_registry()->module(stream.codec.toString().asString(""))));
         if (const std::string why = feeds_.back()->begin(muxer_); !why.empty()) return fail(i, why);
@@ -281,6 +268,10 @@ int FileMultiplexer::feed() {
 }
 
 int FileMultiplexer::run(QvBufStream& output) {
+    if (config_.streams.empty()) {
+        error_ = "There is no stream to multiplex";
+        return QvStatus::invalidArgument;
+    }
     if (muxer_.nrStreams(0) != 0) {
         error_ = "The multiplexer has streams already";
         return QvStatus::illegalState;

@@ -1,5 +1,7 @@
 #include "core/encode/qvfilemux.h"
 
+#include <limits>
+
 #include "core/arch/qvcancel.h"
 #include "core/arch/undo_p.h"
 #include "core/encode/qvmuxer.h"
@@ -172,6 +174,26 @@ int QvFileMux::setUp(QvMuxer& muxer, const Any& output) {
     return QvStatus::ok;
 }
 
+// Before the output is opened, which ends what it held.
+int QvFileMux::checkMuxer(QvMuxer& muxer, QvBufStream& output) {
+    QvFileMuxConfig none;
+    if (muxer.muxElementaryStreams(none, output) == QvStatus::failed && !*muxer.errorDesc())
+        return fail(QvStatus::failed, std::string(muxer.name()) + " does not multiplex files");
+    const Any limits = muxer.getParam("maxStreams");
+    if (!limits.isDict()) return QvStatus::ok;
+    constexpr int any = std::numeric_limits<int>::max();
+    const auto takes = [&](const char* key) { return limits.asDict().getInt32(key, any); };
+    int left[] = {takes("vids"), takes("auds"), takes("subs"), takes("total")};
+    for (std::size_t i = 0; i < config_.streams.size(); ++i) {
+        const int type = config_.streams[i].type;
+        int& ofType = left[type == qvVideoStream ? 0 : type == qvAudioStream ? 1 : 2];
+        if (--ofType < 0 || --left[3] < 0)
+            return fail(QvStatus::invalidArgument,
+                        config_.place(i) + ": " + muxer.name() + " takes no further stream of this type");
+    }
+    return QvStatus::ok;
+}
+
 int QvFileMux::run(const char* muxer, const Any& output) {
     cancel_->clear();
     written_.clear();
@@ -193,6 +215,7 @@ int QvFileMux::multiplex(QvMuxer& muxer, const Any& output) {
     if (!sink) return fail(QvStatus::failed, "There is no sink for files");
     sink->setParam("filename", output);
     QvBufStream& stream = *sink->stream();
+    if (const int result = checkMuxer(muxer, stream); result != QvStatus::ok) return result;
     stream.setCancel(cancel_);
     if (muxer.attachOutStream(&stream) != QvStatus::ok) return fail(QvStatus::failed, muxer.errorDesc());
     const Undo detaching([&muxer] { muxer.detachOutStream(); });
@@ -221,6 +244,5 @@ int QvFileMux::multiplex(QvMuxer& muxer, const Any& output) {
     }
     if (result == QvStatus::ok) return result;
     if (result == cancelled || cancel_->requested()) return fail(cancelled, "The run was stopped");
-    if (why.empty()) why = std::string(muxer.name()) + " does not multiplex files";
-    return fail(result, why);
+    return fail(result, why.empty() ? std::string(muxer.name()) + " failed" : why);
 }

@@ -21,6 +21,7 @@
 #include "core/value/any.h"
 #include "core/value/anycontainer.h"
 
+class QvBufStream;
 class QvCancel;
 class QvMuxer;
 
@@ -100,5 +101,6 @@ class QV_API QvFileMux {
     int checkStream(std::size_t index);
     int checkOutput(const Any& output);
     int setUp(QvMuxer& muxer, const Any& output);
+    int checkMuxer(QvMuxer& muxer, QvBufStream& output);
     int multiplex(QvMuxer& muxer, const Any& output);
 };

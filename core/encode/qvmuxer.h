@@ -31,7 +31,8 @@ class QV_API QvMuxer : public QvEncoder {
     virtual int flush();
     // Multiplexes elementary streams that lie in files ("core/encode/qvfilemux.h") into `output`, from adding
     // the streams to closing. 0; QvFileMux::cancelled; or a status with a text that names the file at fault,
-    // with everything closed. Base: -1, without a text.
+    // with everything closed. Without streams QvStatus::invalidArgument, with nothing done: this is how it is
+    // asked whether it can. Base, which can't: -1, without a text.
     virtual int muxElementaryStreams(QvFileMuxConfig& config, QvBufStream& output);
     // Parameters of one stream within a program. Base: each entry goes to setStreamParam with the
     // invalid parameter failure absorbed; the result is the sum of the results.

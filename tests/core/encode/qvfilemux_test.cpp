@@ -103,12 +103,14 @@ TEST_F(FileMuxCheck, NamesTheStreamAndTheFileAtFault) {
 
 TEST_F(FileMuxCheck, RefusesWhatItCanNotRun) {
     const EngineScope engine;
-    const Any out = narrow(folder.file("out.avi"));
+    const std::string before = folder.write("out.avi", "an output of another run");
+    const Any out = narrow(before);
     const auto run = [&](const char* muxer, const Any& output, const AnyDict& params = {}) {
         QvFileMux mux;
         video(mux);
         mux.config().output = params;
         EXPECT_LT(mux.run(muxer, output), 0);
+        EXPECT_EQ(mux.filesWritten().size(), 0);
         return std::string(mux.errorDesc());
     };
     EXPECT_EQ(run("absent", out), "There is no multiplexer absent");
@@ -120,6 +122,18 @@ TEST_F(FileMuxCheck, RefusesWhatItCanNotRun) {
     EXPECT_EQ(run("rawavimux", out, AnyDict("segments", 0)),
               "rawavimux does not take the parameter 'segments'");
     EXPECT_EQ(TempFolder::read(file), "0123456789");
+
+    QvFileMux many;
+    for (int i = 0; i < 100; ++i) video(many);
+    EXPECT_LT(many.run("rawavimux", out), 0);
+    EXPECT_EQ(many.errorDesc(),
+              "Video stream #99, '" + file + "': rawavimux takes no further stream of this type");
+    QvFileMux text;
+    text.config().addStream(qvSubpicStream, narrow(file), Any("srt"));
+    EXPECT_LT(text.run("rawavimux", out), 0);
+    EXPECT_EQ(text.errorDesc(),
+              "Subpicture stream #0, '" + file + "': rawavimux takes no further stream of this type");
+    EXPECT_EQ(TempFolder::read(before), "an output of another run");
 }
 
 }  // namespace
