@@ -80,7 +80,7 @@ static_assert(std::size(registered) == 44);
 // Module classes that the registry does not list; code of the library makes them by class ("builtin/modules.h").
 constexpr QvBuiltinRow unregistered[] = {
     {"subtitle",     videoFilter,  "Subtitle render",                "Subtitle render",            newSubtitle},
-    {"meminput",     decoder,      "Memory input",                   "Memory input",               nullptr,
+    {"meminput",     decoder,      "Memory input",                   "Memory input",               newMeminput,
      {.internal = true}},
 };
 // clang-format on

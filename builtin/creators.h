@@ -6,6 +6,7 @@
 
 class QvCodec;
 
+QvCodec* newMeminput();
 QvCodec* newRawdec();
 QvCodec* newTestgen();
 QvCodec* newSubimport();

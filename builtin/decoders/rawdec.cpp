@@ -49,6 +49,10 @@ constexpr unsigned ofStream = qvParamWriteOnly;
 
 const QvParamRow<Settings> rows[] = {
     {.name = "filename", .flags = qvParamByHand, .help = "the file", .type = Any::String},
+    {.name = qvSourceParam,
+     .flags = qvParamByHand,
+     .help = "a byte source in the place of the file",
+     .type = Any::Generic},
     {.name = "FOURCC",
      .flags = qvParamByHand | qvParamNeeded,
      .help = "pixel format, text or number; also BGR6 (16 bits a component) and BGRU (rows not padded)",
@@ -100,12 +104,21 @@ int RawDecoder::setParam(const char* name, const Any& value) {
         filename_ = value;
         return QvStatus::ok;
     }
+    if (std::strcmp(name, qvSourceParam) == 0) return setSource(value);
     if (std::strcmp(name, "FOURCC") == 0 || std::strcmp(name, "extendedFOURCC") == 0) return setFOURCC(value);
     Settings changed = settings_;
     if (const auto result = qvSetParamRow<Settings>(rows, changed, name, value))
         return *result == QvStatus::ok ? changeSettings(changed)
                                        : setError(*result, "Invalid value of parameter '%s'", name);
     return QvDecodePipe::setParam(name, value);
+}
+
+int RawDecoder::setSource(const Any& value) {
+    if (value.isValid() && !qvSourceOf(value))
+        return setError(QvStatus::invalidParam, "Invalid value of parameter '%s'", qvSourceParam);
+    if (getState() == stateOpen) close();
+    source_ = qvSourceOf(value);
+    return QvStatus::ok;
 }
 
 int RawDecoder::setFOURCC(const Any& value) {
@@ -200,7 +213,9 @@ int RawDecoder::rewind() {
     if (getState() != stateOpen) return QvStatus::ok;
     frameNr_ = -1;
     pending_ = false;
-    return file_.seek(settings_.offset) ? QvStatus::ok : setError(QvStatus::failed, "Invalid seek pos");
+    return file_.seek(settings_.offset)
+               ? QvStatus::ok
+               : setError(QvStatus::failed, "Invalid seek pos%s", file_.problem().c_str());
 }
 
 void RawDecoder::getParam(const char* name, Any& value) const {
@@ -259,14 +274,14 @@ int RawDecoder::restore(const AnyDict& state) {
 int RawDecoder::open() {
     if (getState() == stateOpen) close();
     if (getState() != stateInitialised) return setError(QvStatus::failed, "Codec not inited");
-    if (!filename_.isText() || filename_.size() == 0)
+    if (!source_ && (!filename_.isText() || filename_.size() == 0))
         return setError(QvStatus::failed, "media dec: filename not set");
     if (!frame_.inited())
         return setError(QvStatus::failed, "Invalid frame size %dx%d", settings_.width, settings_.height);
     if (const int result = checkFields(); result != QvStatus::ok) return result;
     if (const int result = makeConverter(); result != QvStatus::ok) return result;
-    if (file_.open(filename_, readAhead) != QvStatus::ok)
-        return setError(QvStatus::failed, "Can not open file");
+    if (file_.open(filename_, readAhead, source_) != QvStatus::ok)
+        return setError(QvStatus::failed, "Can not open file%s", file_.problem().c_str());
     setState(stateOpen);
     seekable_ = false;
     if (const int result = rewind(); result != QvStatus::ok) {
@@ -388,6 +403,10 @@ int RawDecoder::refuse(int stream) {
     return stream == 0 ? QvStatus::ok : setError(QvStatus::failed, "Invalid stream nr");
 }
 
+int RawDecoder::readFailed() {
+    return setError(QvStatus::failed, "fread() failed%s", file_.problem().c_str());
+}
+
 int RawDecoder::readFrame(int stream) {
     if (const int result = refuse(stream); result != QvStatus::ok) return result;
     if (std::exchange(pending_, false)) return QvStatus::ok;
@@ -399,7 +418,7 @@ int RawDecoder::seekToFrame(long long frame, int stream) {
     if (const int result = refuse(stream); result != QvStatus::ok) return result;
     if (frame < 0 || frame >= nrFrames(0)) return setError(QvStatus::failed, "Invalid seek pos");
     if (!file_.seek(frameBytes() * frame + settings_.offset))
-        return setError(QvStatus::failed, "Invalid seek pos");
+        return setError(QvStatus::failed, "Invalid seek pos%s", file_.problem().c_str());
     frameNr_ = static_cast<int>(frame) - 1;
     pending_ = false;
     const int result = readNext();
@@ -433,8 +452,7 @@ int RawDecoder::readImage(QvFrame& to) {
     }
     if (settings_.invert) return readRows(to);
     const auto bytes = static_cast<std::size_t>(to.total_bytes());
-    return file_.read(to.plane(0), 1, bytes) == bytes ? QvStatus::ok
-                                                      : setError(QvStatus::failed, "fread() failed");
+    return file_.read(to.plane(0), 1, bytes) == bytes ? QvStatus::ok : readFailed();
 }
 
 // The file's first row becomes the last one of its plane.
@@ -444,7 +462,7 @@ int RawDecoder::readRows(QvFrame& to) {
         const int rows = to.plane_bytes(plane) / to.stride(plane);
         unsigned char* row = to.plane(plane, true);
         for (int y = 0; y < rows; ++y, row += to.stride(plane, true))
-            if (file_.read(row, 1, rowBytes) != rowBytes) return setError(QvStatus::failed, "fread() failed");
+            if (file_.read(row, 1, rowBytes) != rowBytes) return readFailed();
     }
     return QvStatus::ok;
 }
@@ -456,8 +474,7 @@ int RawDecoder::readPacked(QvFrame& to) {
     const std::size_t fileRow = static_cast<std::size_t>(rowBytes) * (deep ? 2 : 1);
     const std::size_t bytes = fileRow * static_cast<std::size_t>(to.height(0));
     readBuffer_.resize(bytes);
-    if (file_.read(readBuffer_.data(), 1, bytes) != bytes)
-        return setError(QvStatus::failed, "fread() failed");
+    if (file_.read(readBuffer_.data(), 1, bytes) != bytes) return readFailed();
     const bool flip = settings_.invert;
     const unsigned char* from = readBuffer_.data();
     unsigned char* row = to.plane(0, flip);

@@ -7,11 +7,12 @@
 // Y216) are known beside the formats of QvFrame. A rest after the last frame shows as "truncated" in the
 // stream's parameters.
 //
-// Parameters: "filename", "FOURCC" or "extendedFOURCC" (Int32, or String of four characters; default
-// "BGR4"), "width", "height" (pixels, default 320 x 240), "framerate" (Framerate or frames a second, default
-// 25), "offset" (bytes), "frameAspect" (0: square pixels), "invert" (rows are bottom first in the file),
-// "fieldOrderFile" (a frame's fields come one after the other in the file) and "interlacedFlag"
-// (0 progressive, 1 top field first, 2 bottom field first). Changing a frame's format or the offset rewinds.
+// Parameters: "filename", "source" (see QvByteSource; it has to know its size and to be sought), "FOURCC" or
+// "extendedFOURCC" (Int32, or String of four characters; default "BGR4"), "width", "height" (pixels, default
+// 320 x 240), "framerate" (Framerate or frames a second, default 25), "offset" (bytes), "frameAspect" (0:
+// square pixels), "invert" (rows are bottom first in the file), "fieldOrderFile" (a frame's fields come one
+// after the other in the file) and "interlacedFlag" (0 progressive, 1 top field first, 2 bottom field first).
+// Changing a frame's format or the offset rewinds.
 #pragma once
 
 #include <memory>
@@ -67,6 +68,7 @@ class RawDecoder : public QvDecodePipe {
     enum class FileFormat { plain, rgb48, rgbUnpadded, v210 };
 
     Any filename_;
+    QvByteSource* source_ = nullptr;  // in the place of the file; borrowed
     InputFile file_;
     Settings settings_;
     unsigned extendedFOURCC_ = QvFourcc::BGR4;  // of the file
@@ -81,6 +83,7 @@ class RawDecoder : public QvDecodePipe {
     std::vector<unsigned char> readBuffer_;
     std::unique_ptr<QvCodec> converter_;  // of v210 only
 
+    int setSource(const Any& value);
     int setFOURCC(const Any& value);
     int changeFormat(unsigned code);
     int changeSettings(const Settings& changed);
@@ -102,6 +105,7 @@ class RawDecoder : public QvDecodePipe {
     int readRows(QvFrame& to);
     int convert();
     int refuse(int stream);
+    int readFailed();
     void describe(AnyDict& params) const;
     void storeSettings(AnyDict& dict) const;
 };

@@ -8,6 +8,7 @@
 #include <string>
 
 #include "builtin/creators.h"
+#include "builtin/decoders/sourceparam.h"
 #include "core/arch/qvassert.h"
 #include "core/engine/files/qvfileutil.h"
 #include "core/engine/log/qvlog.h"
@@ -70,6 +71,7 @@ int setOffset(Settings& settings, const Any& value) {
 
 using Access = QvParamAccess<Settings>;
 constexpr QvParamRow<Settings> rows[] = {
+    sourceRow<Settings>,
     {.name = "filenames", .member = Access{setNames, getNames}, .help = "one file for each field"},
     {.name = "filenameField1",
      .member = Access{[](Settings& s, const Any& v) { return setName(s.filenames[0], v); },
@@ -230,12 +232,35 @@ AnyDict SccDec::inOut() const {
 
 // --- Open and close.
 
+// The pairs of a field from its file or, of field 1, from the source.
+int SccDec::readPairs(CCStream& stream, int field, bool detect, QvFramerate& rate, const bool* dropFrame) {
+    const auto index = static_cast<std::size_t>(field);
+    const Any& name = settings_.filenames[index];
+    QvCcData& data = stream.data[index];
+    QvByteSource* const source = field == 0 ? settings_.source : nullptr;
+    const int result = !source ? data.readScc(name, field, detect, rate, dropFrame, settings_.dropFrameLines)
+                       : source->seek(0) ? data.readScc(*source, name, field, detect, rate, dropFrame,
+                                                        settings_.dropFrameLines)
+                                         : QvStatus::noSegment;
+    if (result == QvStatus::ok) return result;
+    std::string why = source ? source->problem() : "";
+    if (!why.empty()) why = ": " + why;
+    return setError(QvStatus::cannotParse, "Failed to open field %d scc file %s%s", field + 1,
+                    textOf(name).c_str(), why.c_str());
+}
+
+long long SccDec::bytesOf(int field) const {
+    if (field == 0 && settings_.source) return settings_.source->position();
+    return std::max(QvFile::flength(settings_.filenames[static_cast<std::size_t>(field)]), 0LL);
+}
+
 // Reads a field's file, if there is one. `rate` becomes its rate.
 int SccDec::readField(CCStream& stream, int field, QvFramerate& rate) {
     const auto index = static_cast<std::size_t>(field);
     const Any& file = settings_.filenames[index];
-    if (!file.isText() || file.size() == 0) return QvStatus::ok;
-    if (!QvFile::isFile(file)) {
+    const bool fromSource = field == 0 && settings_.source;
+    if (!fromSource && (!file.isText() || file.size() == 0)) return QvStatus::ok;
+    if (!fromSource && !QvFile::isFile(file)) {
         qv_log()->warning("There is no file %s for the captions of field %d", textOf(file).c_str(),
                           field + 1);
         return QvStatus::ok;
@@ -244,10 +269,7 @@ int SccDec::readField(CCStream& stream, int field, QvFramerate& rate) {
     const bool fixed = settings_.framerate.isValid();
     if (fixed) rate = settings_.framerate.asFramerate();
     const bool df = rate.df();
-    if (data.readScc(file, field, !fixed, rate, fixed ? &df : nullptr, settings_.dropFrameLines) !=
-        QvStatus::ok)
-        return setError(QvStatus::cannotParse, "Failed to open field %d scc file %s", field + 1,
-                        textOf(file).c_str());
+    if (const int result = readPairs(stream, field, !fixed, rate, fixed ? &df : nullptr)) return result;
     stream.hasData[index] = data.count() > 0;
     if (stream.hasData[index])
         qv_dbg()->info("Opened field %d scc file %s, fr detected as %s", field + 1, textOf(file).c_str(),
@@ -267,12 +289,8 @@ int SccDec::readAtOneRate(CCStream& stream, std::array<QvFramerate, fields>& rat
     rate.setDf(rates[0].df() || rates[1].df());
     rates.fill(rate);
     for (int field = 0; field < fields; ++field) {
-        const auto index = static_cast<std::size_t>(field);
         const bool df = rate.df();
-        if (stream.data[index].readScc(settings_.filenames[index], field, false, rate, &df,
-                                       settings_.dropFrameLines) != QvStatus::ok)
-            return setError(QvStatus::cannotParse, "Failed to open field %d scc file %s", field + 1,
-                            textOf(settings_.filenames[index]).c_str());
+        if (const int result = readPairs(stream, field, false, rate, &df)) return result;
     }
     return QvStatus::ok;
 }
@@ -294,7 +312,7 @@ int SccDec::open() {
     fileSize_ = 0;
     for (std::size_t field = 0; field < fields; ++field) {
         if (!stream->hasData[field]) continue;
-        fileSize_ += std::max(QvFile::flength(settings_.filenames[field]), 0LL);
+        fileSize_ += bytesOf(static_cast<int>(field));
         // A file may go back in time; a search does not.
         if (!stream->data[field].isSorted()) stream->data[field].sort();
     }

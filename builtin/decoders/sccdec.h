@@ -9,7 +9,8 @@
 //     task.linkMeta(decoder, qvSubpicStream, 0, 1, 0);
 //
 // Parameters: "filename" ("FIELD1,FIELD2"; the name of an existing file is never split), "filenames" (a
-// Vector of up to two), "filenameField1", "filenameField2"; "offset" (MediaTime or seconds: the file's time
+// Vector of up to two), "filenameField1", "filenameField2"; "source" (field 1 in the place of its file, see
+// QvByteSource); "offset" (MediaTime or seconds: the file's time
 // of frame 0), read as "timeOffset"; "framerate" (fixes the rate of the timecodes, otherwise it is detected;
 // invalid goes back to that); "readRate" (frames a second that readFrame moves by, set by a video link to the
 // video's; invalid: the rate of the timecodes); "dropFrameLines" (reads lines with ";" before the frames, off
@@ -25,6 +26,7 @@
 
 #include "core/caption/cc/qvcc.h"
 #include "core/decode/basedecodepipe.h"
+#include "core/stream/qvbytesource.h"
 
 class CCStream : public DPipeStream {
   public:
@@ -48,6 +50,7 @@ class SccDec : public BaseDecodePipe {
     using BaseDecodePipe::BaseDecodePipe;
 
     struct Settings {
+        QvByteSource* source = nullptr;  // of field 1, in the place of its file; borrowed
         std::array<Any, CCStream::fields> filenames;
         MediaTime offset;
         Any framerate;  // invalid: detected
@@ -86,6 +89,8 @@ class SccDec : public BaseDecodePipe {
     AnyDict storedSettings() const;
     AnyDict inOut() const;
     int readField(CCStream& stream, int field, QvFramerate& rate);
+    int readPairs(CCStream& stream, int field, bool detect, QvFramerate& rate, const bool* dropFrame);
+    long long bytesOf(int field) const;
     int readAtOneRate(CCStream& stream, std::array<QvFramerate, CCStream::fields>& rates);
     void describe(CCStream& stream) const;
     int framesUntilEnd(const QvFramerate& rate) const;

@@ -6,6 +6,7 @@
 #include <string>
 
 #include "builtin/creators.h"
+#include "builtin/decoders/sourceparam.h"
 #include "core/arch/qvassert.h"
 #include "core/engine/files/qvfileutil.h"
 #include "core/engine/log/qvlog.h"
@@ -45,6 +46,7 @@ std::string textOf(const Any& name) {
 }
 
 constexpr QvParamRow<Settings> rows[] = {
+    sourceRow<Settings>,
     {.name = "framerate",
      .member = QvParamAccess<Settings>{setFramerate, getFramerate},
      .flags = qvParamStored,
@@ -69,20 +71,30 @@ void SubImporter::getParam(const char* name, Any& value) const {
         BaseDecodePipe::getParam(name, value);
 }
 
+int SubImporter::parse() {
+    QvByteSource* const source = settings_.source;
+    if (!source) return subtitles_->parseFile(filename(), settings_.framerate);
+    return source->seek(0) ? subtitles_->parseSource(*source, filename(), settings_.framerate)
+                           : QvStatus::failed;
+}
+
 int SubImporter::open() {
     if (getState() == stateOpen) close();
     subtitles_.emplace();
-    if (subtitles_->parseFile(filename(), settings_.framerate) != QvStatus::ok) {
+    if (parse() != QvStatus::ok) {
         const int before = subtitles_->nrSubtitles();
         const std::string name = textOf(filename());
         subtitles_.reset();
         if (before > 0)
             return setError(QvStatus::cannotParse, "Subtitle file %s: what follows subtitle %d is malformed",
                             name.c_str(), before);
-        return setError(QvStatus::cannotParse, "Subtitle file %s can't be read or is no text", name.c_str());
+        std::string why = settings_.source ? settings_.source->problem() : "";
+        if (!why.empty()) why = ": " + why;
+        return setError(QvStatus::cannotParse, "Subtitle file %s can't be read or is no text%s", name.c_str(),
+                        why.c_str());
     }
     warn();
-    fileSize_ = QvFile::flength(filename());
+    fileSize_ = settings_.source ? settings_.source->position() : QvFile::flength(filename());
     end_ = MediaTime();
     for (int i = 0; i < subtitles_->nrSubtitles(); ++i) end_ = std::max(end_, subtitles_->at(i)->end);
     next_ = 0;

@@ -6,8 +6,9 @@
 //     while (decoder->readFrame(0) == 0) show(importer->subtitle());
 //
 // readFrame moves on by a frame; subtitle() and readMeta then tell what is shown in it. Parameters:
-// "filename"; "framerate" (Framerate or frames a second); "readRate" (the rate at which frames are read, set
-// by a video link to the video's; invalid: "framerate"). Read only: "filesize".
+// "filename"; "source" (in the place of the file, see QvByteSource; "filename" then says "srt" or "sub" by
+// its extension); "framerate" (Framerate or frames a second); "readRate" (the rate at which frames are read,
+// set by a video link to the video's; invalid: "framerate"). Read only: "filesize".
 //
 // Stream parameters: "type" (1), "format" (QvSubtitles::Format), "count" (entries), "encoding" (0),
 // "codec" ("SubRip", "SubViewer" or "MicroDVD"), "textEncoding" (QvSubtitles::encodingName); with entries
@@ -19,12 +20,14 @@
 
 #include "core/caption/subtitle/qvsubtitles.h"
 #include "core/decode/basedecodepipe.h"
+#include "core/stream/qvbytesource.h"
 
 class SubImporter : public BaseDecodePipe {
   public:
     using BaseDecodePipe::BaseDecodePipe;
 
     struct Settings {
+        QvByteSource* source = nullptr;  // borrowed; null: the file
         QvFramerate framerate;
         Any readRate;
     };
@@ -64,6 +67,7 @@ class SubImporter : public BaseDecodePipe {
     QvSubtitle* shown_ = nullptr;
     long long fileSize_ = 0;
 
+    int parse();
     const QvSubtitles& opened() const;
     const QvSubtitles& opened(int stream) const;
     const QvFramerate& readRate() const;

@@ -7,6 +7,7 @@
 #include <utility>
 
 #include "builtin/creators.h"
+#include "builtin/decoders/sourceparam.h"
 #include "core/arch/qvassert.h"
 #include "core/engine/log/qvlog.h"
 #include "core/engine/modules/params.h"
@@ -34,6 +35,7 @@ Refusal refusalFor(WavStatus status) {
 
 using Settings = WavDec::Settings;
 constexpr QvParamRow<Settings> rows[] = {
+    sourceRow<Settings>,
     {.name = "extended",
      .member = &Settings::extended,
      .flags = qvParamStored,
@@ -211,12 +213,12 @@ int WavDec::open() {
     InputFile file;
     WavHeader header;
     const bool extended = settings_.extended;
-    const auto status = file.open(filename(), readAhead) == QvStatus::ok
+    const auto status = file.open(filename(), readAhead, settings_.source) == QvStatus::ok
                             ? readWavHeader(file, header, extended)
                             : WavStatus::cannotOpen;
     if (status != WavStatus::ok) {
         const Refusal refusal = refusalFor(status);
-        return setError(refusal.code, "%s", refusal.text);
+        return setError(refusal.code, "%s%s", refusal.text, file.problem().c_str());
     }
     chunks_.clear();
     otherChunks_.clear();
@@ -224,7 +226,8 @@ int WavDec::open() {
     auto stream = std::make_unique<WavStream>(std::move(file), header, extended);
     if (!stream->pcm->inited()) return setError(QvStatus::outOfMemory, "No memory for samples");
     if (const int result = stream->seek(0); result != QvStatus::ok)
-        return setError(QvStatus::cannotParse, "Failed to open file for reading");
+        return setError(QvStatus::cannotParse, "Failed to open file for reading%s",
+                        stream->problem().c_str());
     addStream(std::move(stream));
     fileSize_ = header.fileSize;
     return QvDecodePipe::open();
@@ -247,8 +250,11 @@ WavStream& WavDec::wavStream(int stream) const {
 
 int WavDec::readSamples(int count, int stream) {
     if (count == 0) return 0;
-    const int result = wavStream(stream).read(count);
-    return result == QvStatus::cannotParse ? setError(result, "read samples failed") : result;
+    WavStream& sound = wavStream(stream);
+    const int result = sound.read(count);
+    return result == QvStatus::cannotParse
+               ? setError(result, "read samples failed%s", sound.problem().c_str())
+               : result;
 }
 
 int WavDec::seekToSample(long long sample, int stream) { return wavStream(stream).seek(sample); }

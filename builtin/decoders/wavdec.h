@@ -1,7 +1,8 @@
 // Decoder "wavdec": sound from RIFF WAVE files, PCM of 8, 16 or 24 bits and up to 8 channels.
 //
-// Parameters: "extended" (stored, off at first; counts at the next open) also reads RF64, BW64 and RIFX, up
-// to 256 channels, and these values:
+// Parameters: "source" (in the place of the file, see QvByteSource; it has to know its size and to be
+// sought); "extended" (stored, off at first; counts at the next open) also reads RF64, BW64 and RIFX, up to
+// 256 channels, and these values:
 //
 //     in the file                      delivered
 //     PCM of 1 to 24 bits              8, 16 or 24 bits; narrow values are the upper bits of their bytes
@@ -35,6 +36,7 @@ class WavStream : public DPipeAudioStream {
 
     int read(int count);         // as readSamples; QvStatus::cannotParse when the file gives nothing
     int seek(long long sample);  // QvStatus::endOfStream when the file does not move
+    std::string problem() const { return file_.problem(); }
 
     const WavHeader& header() const { return header_; }
     long long clipped() const { return clipped_; }
@@ -59,6 +61,7 @@ class WavDec : public BaseDecodePipe {
     using BaseDecodePipe::BaseDecodePipe;
 
     struct Settings {
+        QvByteSource* source = nullptr;  // borrowed; null: the file
         bool extended = false;
     };
 

@@ -1,6 +1,7 @@
 #include "builtin/muxers/rawavimux.h"
 
 #include "builtin/creators.h"
+#include "builtin/muxers/filestreams.h"
 #include "builtin/muxers/rawavimuxbytes.h"
 #include "builtin/muxers/streamcodec.h"
 #include "core/arch/qvassert.h"
@@ -203,6 +204,12 @@ int RawAviMux::fail() {
     QvIoFailure failure;
     interleaver_.tell(failure);
     return setError(QvStatus::failed, "%s", failure.text().c_str());
+}
+
+int RawAviMux::muxElementaryStreams(QvFileMuxConfig& config, QvBufStream& output) {
+    std::string error;
+    const int result = qvMuxFiles(*this, config, output, error);
+    return result < 0 ? setError(result, "%s", error.c_str()) : result;
 }
 
 QvCodec* newRawavimux() { return new RawAviMux; }

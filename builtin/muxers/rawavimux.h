@@ -39,6 +39,7 @@ class RawAviMux : public BaseMuxer {
     // Result and text tell when something of the file could not be written.
     int close() override;
     int abort() override;
+    int muxElementaryStreams(QvFileMuxConfig& config, QvBufStream& output) override;
 
   private:
     int describe(int type, int nr, std::vector<AviInterleaver::Source>& sources);

@@ -5,6 +5,7 @@
 #include <string>
 
 #include "builtin/creators.h"
+#include "builtin/muxers/filestreams.h"
 #include "builtin/muxers/rawmuxoutput.h"
 #include "builtin/muxers/streamcodec.h"
 #include "builtin/shared/rawoutput.h"
@@ -268,6 +269,12 @@ AnyVector RawMux::filesWritten() const {
     AnyVector files;
     for (const auto& output : outputs_) output->appendFiles(files);
     return files;
+}
+
+int RawMux::muxElementaryStreams(QvFileMuxConfig& config, QvBufStream& output) {
+    std::string error;
+    const int result = qvMuxFiles(*this, config, output, error);
+    return result < 0 ? setError(result, "%s", error.c_str()) : result;
 }
 
 QvCodec* newRawmux() { return new RawMux; }

@@ -50,6 +50,7 @@ class RawMux : public OwnFilesMuxer {
     // Result and text tell when a file could not be written to its end.
     int close() override;
     int abort() override;
+    int muxElementaryStreams(QvFileMuxConfig& config, QvBufStream& output) override;
 
     // What the read-only parameters of these names answer.
     Any extension() const;

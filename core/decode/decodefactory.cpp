@@ -2,9 +2,11 @@
 
 #include <memory>
 #include <string>
+#include <utility>
 
 #include "core/arch/qvassert.h"
 #include "core/arch/qvexception.h"
+#include "core/decode/memoryinput_p.h"
 #include "core/decode/qvdecoder.h"
 #include "core/engine/files/qvfileutil.h"
 #include "core/engine/log/qvlog.h"
@@ -12,6 +14,7 @@
 #include "core/engine/modules/qvmodule.h"
 #include "core/engine/modules/qvregistry.h"
 #include "core/engine/status.h"
+#include "core/stream/qvbytesource.h"
 
 namespace {
 
@@ -137,20 +140,6 @@ std::string setAll(QvDecodePipe& decoder, const AnyDict& params) {
     return "";
 }
 
-// All decoders that list the extension, those that are never chosen by it alone as well.
-AnyVector decodersOf(const Any& extension) {
-    AnyVector modules = qv_registry()->decoders(extension.asString(""));
-    if (!modules.empty()) return modules;
-    for (int i = 0; i < qv_registry()->nrModules(0); ++i) {
-        const QvModule& module = *qv_registry()->module(i);
-        const Any extensions = module.getAttr("exts");
-        if (module.getAttr("type").toInt32() != QvModuleType::decoder || !extensions.isVector()) continue;
-        for (const Any& own : extensions.asVector())
-            if (own == extension) modules.append(Any(module.name()));
-    }
-    return modules;
-}
-
 void applyOverrides(QvDecodePipe& decoder, int type, const Any& saved) {
     if (!saved.isVector()) return;
     const AnyVector& streams = saved.asVector();
@@ -168,6 +157,19 @@ void applyOverrides(QvDecodePipe& decoder, int type, const Any& saved) {
 }
 
 }  // namespace
+
+AnyVector qvDecodersOf(const Any& extension) {
+    AnyVector modules = qv_registry()->decoders(extension.asString(""));
+    if (!modules.empty()) return modules;
+    for (int i = 0; i < qv_registry()->nrModules(0); ++i) {
+        const QvModule& module = *qv_registry()->module(i);
+        const Any extensions = module.getAttr("exts");
+        if (module.getAttr("type").toInt32() != QvModuleType::decoder || !extensions.isVector()) continue;
+        for (const Any& own : extensions.asVector())
+            if (own == extension) modules.append(Any(module.name()));
+    }
+    return modules;
+}
 
 QvDecodePipe* QvDecFactory::decodePipe(const Any& filename, const Any& fourcc, QvFileOpenCb* cb,
                                        const Any* openParams) {
@@ -217,7 +219,7 @@ QvDecodePipe* QvDecFactory::decodePipeUsing(const Any& filename, const AnyVector
 QvDecodePipe* QvDecFactory::decodePipeWith(const Any& filename, const AnyDict& params, Any* error,
                                            const char* module, QvFileOpenCb* cb) {
     const Any extension = extensionOf(filename);
-    const AnyVector modules = module ? AnyVector(Any(module)) : decodersOf(extension);
+    const AnyVector modules = module ? AnyVector(Any(module)) : qvDecodersOf(extension);
     Reporter reporter(filename, cb);
     std::string reasons;
     const auto fail = [&](const std::string& reason) {
@@ -255,6 +257,23 @@ QvDecodePipe* QvDecFactory::decodePipeWith(const Any& filename, const AnyDict& p
     if (error) *error = Any(reasons.c_str());
     return nullptr;
 }
+
+QvDecodePipe* QvDecFactory::decodeSource(std::unique_ptr<QvByteSource> source, const Any& name,
+                                         const AnyDict& params, Any* error, const char* module) {
+    std::unique_ptr<QvDecodePipe> decoder = qvNewMemoryInput(std::move(source));
+    decoder->setParam("filename", name);
+    if (module) decoder->setParam("decoder", module);
+    std::string reason = setAll(*decoder, params);
+    if (reason.empty()) {
+        if (decoder->open() == QvStatus::ok) return decoder.release();
+        reason = decoder->errorDesc();
+    }
+    logError(Any(reason.c_str()));
+    if (error) *error = Any(reason.c_str());
+    return nullptr;
+}
+
+QvDecodePipe* QvDecFactory::newMemoryInput() { return qvNewMemoryInput(nullptr).release(); }
 
 QvDecodePipe* QvDecFactory::restoreDecoder(const Any& filename, const AnyDict& state, QvFileOpenCb* cb) {
     QV_ASSERT_MSG(state["name"].isString(),

@@ -1,11 +1,14 @@
 // From a file name to an open decoder.
 #pragma once
 
+#include <memory>
+
 #include "core/arch/api.h"
 #include "core/decode/qvfileopencb.h"
 #include "core/value/any.h"
 #include "core/value/anycontainer.h"
 
+class QvByteSource;
 class QvDecodePipe;
 
 // A file name is a String, a WString, or a Vector of these (a file in several pieces, opened by the first
@@ -33,6 +36,20 @@ class QV_API QvDecFactory {
     //     QvDecodePipe* clip = QvDecFactory::decodePipeWith(Any("clip.yuv"), format, &error);
     static QvDecodePipe* decodePipeWith(const Any& filename, const AnyDict& params, Any* error = nullptr,
                                         const char* module = nullptr, QvFileOpenCb* cb = nullptr);
+    // The same of bytes that are in no file. `name` says by its extension which decoders are tried, and
+    // stands for a file name in messages. The decoder, a memory input ("meminput"), owns the source.
+    //
+    //     QvDecodePipe* sound = QvDecFactory::decodeSource(qvBlockSource(data, bytes), Any("call.wav"), {},
+    //                                                      &error);
+    static QvDecodePipe* decodeSource(std::unique_ptr<QvByteSource> source, const Any& name,
+                                      const AnyDict& params = AnyDict(), Any* error = nullptr,
+                                      const char* module = nullptr);
+    // A memory input that is not open, owned by the caller. It takes the parameters "source" (which stays the
+    // caller's), "decoder" (the name of a module) or "extension" or a "filename" that has one; at open it
+    // makes that decoder, or the first of the extension that opens, and is that decoder from then on:
+    // streams, parameters, seeks, overrides. Other parameters are kept for it until open, where those that it
+    // does not take are refused. Its bytes are not part of what store writes.
+    static QvDecodePipe* newMemoryInput();
     // Opens a decoder with the parameters and overrides that QvDecodePipe::store wrote. Asserts that `state`
     // names a module.
     //

@@ -29,7 +29,10 @@ class QV_API QvMuxer : public QvEncoder {
     virtual int nrStreams(int type) const = 0;
     virtual QvBufStream* stream(int type, int nr) const = 0;
     virtual int flush();
-    // Multiplexes finished elementary streams. Base: -1.
+    // Multiplexes elementary streams that lie in files ("core/encode/qvfilemux.h") into `output`, from adding
+    // the streams to closing. 0; QvFileMux::cancelled; or a status with a text that names the file at fault,
+    // with everything closed. Without streams QvStatus::invalidArgument, with nothing done: this is how it is
+    // asked whether it can. Base, which can't: -1, without a text.
     virtual int muxElementaryStreams(QvFileMuxConfig& config, QvBufStream& output);
     // Parameters of one stream within a program. Base: each entry goes to setStreamParam with the
     // invalid parameter failure absorbed; the result is the sum of the results.

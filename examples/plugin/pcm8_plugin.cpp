@@ -1,28 +1,38 @@
-// A plug-in with two modules: "pcm8dec" reads files of bare 8-bit mono sound (*.pcm8), and "polarity" turns
-// sound upside down. docs/plugins.md walks through it.
+// A plug-in with two modules: "pcm8dec" reads bare 8-bit mono sound from files (*.pcm8) and byte sources, and
+// "polarity" turns sound upside down. docs/plugins.md walks through it.
 #include <algorithm>
 #include <climits>
-#include <cstdio>
 #include <cstring>
 #include <memory>
 
 #include "core/decode/basedecodepipe.h"
-#include "core/engine/files/qvfileutil.h"
 #include "core/engine/modules/params.h"
 #include "core/engine/modules/qvmodule.h"
 #include "core/engine/modules/qvplugin.h"
 #include "core/filter/qvfilter.h"
 #include "core/measure/qvgeometry.h"
 #include "core/media/qvbuffer.h"
+#include "core/stream/qvbytesource.h"
 
 namespace {
 
 struct Pcm8Settings {
     int samplerate = 8000;  // such a file doesn't tell
+    QvByteSource* source = nullptr;
 };
+
+int setSource(Pcm8Settings& settings, const Any& value) {
+    settings.source = qvSourceOf(value);
+    return value.isValid() && !settings.source ? QvStatus::invalidParam : QvStatus::ok;
+}
 
 constexpr QvParamRow<Pcm8Settings> pcm8Rows[] = {
     {"samplerate", &Pcm8Settings::samplerate, qvParamStored, 1000, 192000, "samples a second"},
+    {.name = qvSourceParam,
+     .member = QvParamAccess<Pcm8Settings>{setSource, nullptr},
+     .flags = qvParamWriteOnly,
+     .help = "a byte source in the place of the file",
+     .type = Any::Generic},
 };
 static_assert(qvParamTableOk<Pcm8Settings>(pcm8Rows));
 
@@ -40,10 +50,13 @@ class Pcm8Dec : public BaseDecodePipe {
     }
 
     int open() override {
-        file_.reset(static_cast<std::FILE*>(QvFile::fopen(filename(), "rb")));
-        if (!file_) return setError(QvStatus::cannotParse, "Failed to open file for reading");
+        // The file is a byte source, too, so that there is one way to read.
+        if (!settings_.source) file_ = qvFileSource(filename());
+        in_ = settings_.source ? settings_.source : file_.get();
+        if (!in_ || in_->size() == QvByteSource::unknown || !in_->seek(0))
+            return setError(QvStatus::cannotParse, "Failed to open file for reading");
         auto stream = std::make_unique<DPipeAudioStream>();
-        const long long samples = QvFile::flength(file_.get());
+        const long long samples = in_->size();
         stream->params = AnyDict("codec", "PCM", "channels", 1, "samplerate", settings_.samplerate, "samples",
                                  samples, "bitsPerSample", 8, "bytesPerSample", 1);
         stream->params.set("duration", Any(static_cast<double>(samples) / settings_.samplerate));
@@ -54,6 +67,7 @@ class Pcm8Dec : public BaseDecodePipe {
         return BaseDecodePipe::open();  // ends every open: state 3
     }
     int close() override {
+        in_ = nullptr;
         file_.reset();
         pcm_ = nullptr;
         return BaseDecodePipe::close();  // deletes the stream
@@ -64,29 +78,26 @@ class Pcm8Dec : public BaseDecodePipe {
         if (count > pcm_->size() && pcm_->grow(count - pcm_->size()) < 0)
             return setError(QvStatus::outOfMemory, "Out of memory");
         const int got =
-            count > 0
-                ? static_cast<int>(std::fread(pcm_->ptr(0), 1, static_cast<std::size_t>(count), file_.get()))
-                : 0;
+            count > 0 ? static_cast<int>(in_->read(pcm_->ptr(0), static_cast<std::size_t>(count))) : 0;
         pcm_->setSamples(got);
         pcm_->setPosition(pcm_->position() + got);
+        if (got == 0 && !in_->problem().empty())
+            return setError(QvStatus::failed, "read samples failed: %s", in_->problem().c_str());
         return got > 0 || count <= 0 ? got : QvStatus::endOfStream;
     }
     int seekToSample(long long sample, int stream) override {
         checkStream(qvAudioStream, stream, "seekToSample");
-        if (sample < 0 || std::fseek(file_.get(), static_cast<long>(sample), SEEK_SET) != 0)
-            return setError(QvStatus::endOfStream, "Seek failed");
+        if (!in_->seek(sample)) return setError(QvStatus::endOfStream, "Seek failed");
         pcm_->setPosition(sample);
         return QvStatus::ok;
     }
     QvPcm* getAudioPtr(int) override { return pcm_; }
 
   private:
-    struct Closer {
-        void operator()(std::FILE* file) const { std::fclose(file); }
-    };
     Pcm8Settings settings_;
-    std::unique_ptr<std::FILE, Closer> file_;
-    QvPcm* pcm_ = nullptr;  // the stream's
+    std::unique_ptr<QvByteSource> file_;
+    QvByteSource* in_ = nullptr;  // of the file, or the application's
+    QvPcm* pcm_ = nullptr;        // the stream's
 };
 
 // Between the stages of an audio pipe a value has 32 bits and holds a number of 24; there is room to negate.

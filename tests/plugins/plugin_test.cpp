@@ -13,8 +13,10 @@
 #include "core/engine/modules/qvmodule.h"
 #include "core/engine/modules/qvplugin.h"
 #include "core/engine/modules/qvregistry.h"
+#include "core/engine/status.h"
 #include "core/filter/qvfilter.h"
 #include "core/media/qvbuffer.h"
+#include "core/stream/qvbytesource.h"
 #include "tests/support/checks.h"
 
 namespace {
@@ -47,6 +49,30 @@ struct Plugins : testing::Test {
     LogCapture log;
     QvRegistry& registry = *qv_registry();
 };
+
+TEST_F(Plugins, ADecoderReadsByteSources) {
+    load(bring("pcm8_plugin.so"));
+    const std::string bytes("\x80\xFF\x01\x02", 4);
+    QvSourceCallbacks broken{.read = [](void*, std::size_t) { return -1LL; },
+                             .seek = [](long long) { return true; },
+                             .size = [] { return 4LL; }};
+    const auto open = [](std::unique_ptr<QvByteSource> source) {
+        return std::unique_ptr<QvDecodePipe>(
+            QvDecFactory::decodeSource(std::move(source), Any("x.pcm8"), AnyDict("samplerate", 4000)));
+    };
+    const auto decoder = open(qvBlockSource(bytes.data(), bytes.size()));
+    ASSERT_TRUE(decoder);
+    EXPECT_STREQ(decoder->getParam("decoder").asString(), "pcm8dec");
+    EXPECT_EQ(decoder->getAudioParam(0, "samplerate").toInt32(), 4000);
+    EXPECT_EQ(decoder->seekToSample(1, 0), 0);
+    ASSERT_EQ(decoder->readSamples(9, 0), 3);
+    EXPECT_EQ(std::memcmp(decoder->getAudioPtr(0)->ptr(0), bytes.data() + 1, 3), 0);
+    EXPECT_EQ(decoder->readSamples(9, 0), QvStatus::endOfStream);
+    const auto failing = open(qvCallbackSource(broken));
+    ASSERT_TRUE(failing);
+    EXPECT_EQ(failing->readSamples(1, 0), QvStatus::failed);
+    EXPECT_STREQ(failing->errorDesc(), "read samples failed: the source reports a failure");
+}
 
 TEST_F(Plugins, ScanFindsModulesByExtensionNameAndKind) {
     const std::string file = bring("pcm8_plugin.so");

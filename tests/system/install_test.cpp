@@ -24,6 +24,18 @@ TEST_F(Examples, CopySound) {
     EXPECT_EQ(runProgram({program, "absent.wav", "x.wav"}, here()).status, 1);
 }
 
+TEST_F(Examples, SoundFromMemory) {
+    makeWav("take.wav", 12345, 2, 24, 48000);
+    const std::string program = QV_BINARY_DIR "/examples/sound_from_memory";
+    const Outcome block = runProgram({program, "take.wav"}, here());
+    EXPECT_EQ(block.status, 0) << block.err;
+    EXPECT_THAT(block.out, HasSubstr("12345 samples, peak "));
+    EXPECT_EQ(runProgram({program, "take.wav", "callbacks"}, here()).out, block.out);
+    const Outcome absent = runProgram({program, "absent.wav"}, here());
+    EXPECT_EQ(absent.status, 1);
+    EXPECT_THAT(absent.err, HasSubstr("absent.wav: wavdec: Failed to parse WAV file"));
+}
+
 // A raw clip, a filter, progress, cancelling and causes, as docs/embedding.md shows.
 TEST_F(Examples, Watermark) {
     const std::string program = QV_BINARY_DIR "/examples/watermark";

@@ -209,7 +209,11 @@ int QvCcData::_fromBufferGeneric(int size, const unsigned char* data, const Medi
 
 int QvCcData::readScc(const Any& filename, int type, bool detect, QvFramerate& rate, const bool* dropFrame,
                       bool dropFrameLines) {
-    return qvReadScc(filename, type, detect, rate, dropFrame, dropFrameLines, pairs_);
+    return qvReadScc(nullptr, filename, type, detect, rate, dropFrame, dropFrameLines, pairs_);
+}
+int QvCcData::readScc(QvByteSource& source, const Any& name, int type, bool detect, QvFramerate& rate,
+                      const bool* dropFrame, bool dropFrameLines) {
+    return qvReadScc(&source, name, type, detect, rate, dropFrame, dropFrameLines, pairs_);
 }
 std::string QvCcData::sccText(const QvFramerate& rate, const QvSccWriting& options) const {
     return qvSccText(pairs_, rate, options);

@@ -21,6 +21,7 @@
 class Any;
 class AnyDict;
 class AnyVector;
+class QvByteSource;
 
 struct QV_API QvCcBytePair {
     enum Type { field1 = 0, field2 = 1, dtvccData = 2, dtvccStart = 3 };  // the first two are CEA-608
@@ -145,6 +146,10 @@ class QV_API QvCcData {
     //                   the start; words that are damaged are named in warnings, with their lines
     int readScc(const Any& filename, int type, bool detect, QvFramerate& rate, const bool* dropFrame,
                 bool dropFrameLines = false);
+    // The same from where a source is to its end, which it has to reach. `name` is for messages. A source
+    // need not be sought, nor know its size; then QvByteSource::mostUnknown is the most that is read.
+    int readScc(QvByteSource& source, const Any& name, int type, bool detect, QvFramerate& rate,
+                const bool* dropFrame, bool dropFrameLines = false);
     // Writes all pairs, whatever their type, a run of equal times as one line. 0; -1 for a file that can't be
     // written. An assertion, with no file touched, for a line of more than 1000 pairs.
     int writeScc(const Any& filename, const QvFramerate& rate, const QvSccWriting& options = {}) const;

@@ -2,16 +2,15 @@
 
 #include <algorithm>
 #include <array>
-#include <cstdio>
 #include <cstdlib>
 #include <cstring>
 #include <memory>
 #include <string>
 #include <string_view>
 
-#include "core/engine/files/qvfileutil.h"
 #include "core/engine/log/qvlog.h"
 #include "core/engine/status.h"
+#include "core/stream/qvbytesource.h"
 
 namespace {
 
@@ -29,7 +28,8 @@ constexpr long largestHour = 9900;  // the frames of more go beyond an int
 class LineReader {
   public:
     // `returns`: a carriage return ends a line, too, and a UTF-8 mark is no part of the first one.
-    LineReader(std::FILE* file, bool returns) : file_(file), block_(new char[blockSize]), returns_(returns) {
+    LineReader(QvByteSource& source, bool returns)
+        : source_(source), block_(new char[blockSize]), returns_(returns) {
         refill();
         if (returns && std::string_view(block_.get(), end_).starts_with(mark)) begin_ = mark.size();
     }
@@ -47,7 +47,7 @@ class LineReader {
         begin_ += end + (pair ? 2 : end < rest.size() ? 1 : 0);
         return true;
     }
-    bool failed() const { return std::ferror(file_) != 0; }
+    bool failed() const { return failed_; }
 
   private:
     void refill() {
@@ -55,16 +55,20 @@ class LineReader {
         std::memmove(block_.get(), block_.get() + begin_, end_ - begin_);
         end_ -= begin_;
         begin_ = 0;
-        const std::size_t got = std::fread(block_.get() + end_, 1, blockSize - end_, file_);
-        atEnd_ = got == 0;
+        const std::size_t got = source_.read(block_.get() + end_, blockSize - end_);
+        const bool endless =
+            source_.size() == QvByteSource::unknown && source_.position() > QvByteSource::mostUnknown;
+        atEnd_ = got == 0 || endless;
+        failed_ = endless || (got == 0 && !source_.problem().empty());
         end_ += got;
     }
 
-    std::FILE* file_;
+    QvByteSource& source_;
     std::unique_ptr<char[]> block_;
     bool returns_;
     std::size_t begin_ = 0, end_ = 0;
     bool atEnd_ = false;
+    bool failed_ = false;
 };
 
 // Control characters are blanks, too.
@@ -163,17 +167,18 @@ void readLine(std::string_view line, int number, bool dropFrameLines, SccFile& s
 }  // namespace
 
 int SccFile::read(const Any& filename, bool dropFrameLines) {
-    const auto close = [](std::FILE* file) { std::fclose(file); };
-    const std::unique_ptr<std::FILE, decltype(close)> file(
-        static_cast<std::FILE*>(QvFile::fopen(filename, "rb")), close);
+    if (const auto file = qvFileSource(filename)) return read(*file, filename, dropFrameLines);
+    qv_dbg()->error("Failed to open SCC file %s.", filename.toString().asString(""));
+    return QvStatus::failed;
+}
+
+int SccFile::read(QvByteSource& source, const Any& filename, bool dropFrameLines) {
     const Any name = filename.toString();
     const auto refuse = [&name] {
         qv_dbg()->error("Failed to open SCC file %s.", name.asString(""));
         return QvStatus::failed;
     };
-    if (!file) return refuse();
-
-    LineReader reader(file.get(), dropFrameLines);
+    LineReader reader(source, dropFrameLines);
     std::string_view line;
     const bool known = reader.next(line) && line.starts_with(signature);
     if (reader.failed()) return refuse();

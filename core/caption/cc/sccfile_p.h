@@ -10,6 +10,7 @@
 #include "core/measure/timecode.h"
 
 class Any;
+class QvByteSource;
 
 struct SccLine {
     QvTimecode timecode;
@@ -30,6 +31,8 @@ struct SccFile {
     // With `dropFrameLines` lines with ";" count, carriage returns end lines, and a UTF-8 mark may stand at
     // the start. 0; -1: can't be opened or read; -15: no SCC file.
     int read(const Any& filename, bool dropFrameLines);
+    // From where the source is to its end. `name` is for messages.
+    int read(QvByteSource& source, const Any& name, bool dropFrameLines);
     // What the highest frame number suggests; with `warn` the log says so if that is a guess.
     QvFramerate likelyRate(bool warn) const;
 };

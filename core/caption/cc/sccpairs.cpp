@@ -39,11 +39,13 @@ void reportDamage(const SccFile& scc, const char* name) {
 
 }  // namespace
 
-int qvReadScc(const Any& filename, int type, bool detect, QvFramerate& rate, const bool* dropFrame,
-              bool dropFrameLines, std::vector<QvCcBytePair>& pairs) {
+int qvReadScc(QvByteSource* source, const Any& filename, int type, bool detect, QvFramerate& rate,
+              const bool* dropFrame, bool dropFrameLines, std::vector<QvCcBytePair>& pairs) {
     QV_ASSERT(type == QvCcBytePair::field1 || type == QvCcBytePair::field2);
     SccFile scc;
-    if (scc.read(filename, dropFrameLines) != QvStatus::ok) return QvStatus::noSegment;
+    const int result =
+        source ? scc.read(*source, filename, dropFrameLines) : scc.read(filename, dropFrameLines);
+    if (result != QvStatus::ok) return QvStatus::noSegment;
     if (dropFrameLines) reportDamage(scc, filename.toString().asString(""));
     const QvFramerate likely = scc.likelyRate(detect);
     if (detect)

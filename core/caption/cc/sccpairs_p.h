@@ -7,9 +7,10 @@
 
 #include "core/caption/cc/qvcc.h"
 
-// As QvCcData::readScc. `pairs` are replaced, and stay if the result is not 0.
-int qvReadScc(const Any& filename, int type, bool detect, QvFramerate& rate, const bool* dropFrame,
-              bool dropFrameLines, std::vector<QvCcBytePair>& pairs);
+// As QvCcData::readScc; from the source unless that is null. `pairs` are replaced, and stay if the result is
+// not 0.
+int qvReadScc(QvByteSource* source, const Any& filename, int type, bool detect, QvFramerate& rate,
+              const bool* dropFrame, bool dropFrameLines, std::vector<QvCcBytePair>& pairs);
 // As QvCcData::sccText.
 std::string qvSccText(std::span<const QvCcBytePair> pairs, const QvFramerate& rate,
                       const QvSccWriting& options);

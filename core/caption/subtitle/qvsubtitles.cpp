@@ -97,6 +97,16 @@ int QvSubtitles::begin(const Any& filename, const QvFramerate& rate) {
 int QvSubtitles::parseFile(const Any& filename, const QvFramerate& rate) {
     SubtitleBytes file;
     if (begin(filename, rate) != QvStatus::ok || file.read(filename) != QvStatus::ok) return QvStatus::failed;
+    return parseBytes(file);
+}
+
+int QvSubtitles::parseSource(QvByteSource& source, const Any& name, const QvFramerate& rate) {
+    SubtitleBytes bytes;
+    if (begin(name, rate) != QvStatus::ok || bytes.read(source) != QvStatus::ok) return QvStatus::failed;
+    return parseBytes(bytes);
+}
+
+int QvSubtitles::parseBytes(const SubtitleBytes& file) {
     const Format format = format_;
     const SubtitleMark mark = findMark(file.view());
     encoding_ = static_cast<Encoding>(mark.encoding);

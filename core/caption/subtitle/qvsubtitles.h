@@ -11,6 +11,8 @@
 #include "core/value/any.h"
 #include "core/value/anycontainer.h"
 
+class QvByteSource;
+class SubtitleBytes;
 struct ParsedSubtitle;
 
 // One entry: lines of text that are shown for a time.
@@ -65,6 +67,10 @@ class QV_API QvSubtitles {
     // 0, also for a file without any entry. -1: it can't be read, is no text, or has another extension, or a
     // SUB line is malformed; the entries before that line are kept.
     int parseFile(const Any& filename, const QvFramerate& rate);
+    // The same of a byte source, from where it is to its end, which it has to reach. `name` has the
+    // extension. The source need not be sought, nor know its size; then QvByteSource::mostUnknown is the most
+    // that is read.
+    int parseSource(QvByteSource& source, const Any& name, const QvFramerate& rate);
     // For files as people have them: parseFile on a copy of the text, in memory, that has been made UTF-8 and
     // whose line ends, times, tags, and order are what parseFile expects. `encoding`: of QvText, for a file
     // without a mark; 0: ASCII or UTF-8, and if it is neither, what its letters are most probably in.
@@ -108,6 +114,7 @@ class QV_API QvSubtitles {
     QvFramerate rate_;
 
     int begin(const Any& filename, const QvFramerate& rate);
+    int parseBytes(const SubtitleBytes& bytes);
     void take(ParsedSubtitle&& parsed);
     int parse(std::string_view text, std::size_t bound);
     bool hit(int index, const MediaTime& time);

@@ -1,25 +1,20 @@
 #include "core/caption/subtitle/subtitletext_p.h"
 
 #include <algorithm>
-#include <cstdio>
 #include <limits>
 
 #include "core/arch/platform.h"
 #include "core/caption/subtitle/qvsubtitles.h"
 #include "core/caption/text/qvtext.h"
-#include "core/engine/files/qvfileutil.h"
 #include "core/engine/log/qvlog.h"
 #include "core/engine/status.h"
+#include "core/stream/qvbytesource.h"
 
 namespace {
 
 using namespace std::string_view_literals;
 
 constexpr std::size_t spareBytes = 4;
-
-struct CloseFile {
-    void operator()(std::FILE* file) const { std::fclose(file); }
-};
 
 // Old files end their lines with a carriage return alone; the first line tells.
 bool endsLinesWithCr(std::string_view text) {
@@ -50,22 +45,43 @@ bool hasUnits(const SubtitleMark& mark) { return mark.encoding >= QvSubtitles::m
 void SubtitleBytes::Release::operator()(char* memory) const { qv_platform().release(memory); }
 
 int SubtitleBytes::read(const Any& filename) {
-    if (!filename.isText() || filename.size() == 0) return QvStatus::failed;
-    const std::unique_ptr<std::FILE, CloseFile> file(static_cast<std::FILE*>(qvfopen(filename, "rb")));
-    if (!file) return QvStatus::failed;
-    const long long length = QvFile::flength(file.get());
-    if (length < 0) return QvStatus::failed;
-    const bool fits = length <= std::numeric_limits<int>::max() - static_cast<int>(spareBytes);
-    const auto room = static_cast<std::size_t>(length) + spareBytes;
+    const auto file = qvFileSource(filename);
+    return file && file->size() != QvByteSource::unknown ? read(*file) : QvStatus::failed;
+}
+
+int SubtitleBytes::allocate(long long bytes) {
+    const bool fits = bytes <= std::numeric_limits<int>::max() - static_cast<int>(spareBytes);
+    const auto room = static_cast<std::size_t>(bytes) + spareBytes;
     memory_.reset(fits ? static_cast<char*>(qv_platform().allocate(room, 16)) : nullptr);
-    if (!memory_) {
-        qv_dbg()->error("parseFile() internal error");
-        return QvStatus::failed;
+    if (memory_) return QvStatus::ok;
+    qv_dbg()->error("parseFile() internal error");
+    return QvStatus::failed;
+}
+
+int SubtitleBytes::read(QvByteSource& source) {
+    const long long said = source.size();
+    std::string gathered;  // what comes of a source of unknown size
+    if (said == QvByteSource::unknown) {
+        constexpr std::size_t piece = 64 * 1024;
+        for (std::size_t got = piece; got == piece;) {
+            const std::size_t had = gathered.size();
+            gathered.resize(had + piece);
+            got = source.read(gathered.data() + had, piece);
+            gathered.resize(had + got);
+            if (gathered.size() > static_cast<std::size_t>(QvByteSource::mostUnknown))
+                return QvStatus::failed;
+        }
     }
-    size_ = std::fread(memory_.get(), 1, static_cast<std::size_t>(length), file.get());
-    std::fill_n(memory_.get() + size_, room - size_, '\0');
+    const long long length =
+        said == QvByteSource::unknown ? static_cast<long long>(gathered.size()) : said - source.position();
+    if (length < 0 || allocate(length) != QvStatus::ok) return QvStatus::failed;
+    const auto wanted = static_cast<std::size_t>(length);
+    size_ = said == QvByteSource::unknown ? gathered.copy(memory_.get(), wanted)
+                                          : source.read(memory_.get(), wanted);
     // A file that got shorter meanwhile is being written.
-    return size_ == static_cast<std::size_t>(length) ? QvStatus::ok : QvStatus::failed;
+    if (size_ != wanted || source.failed()) return QvStatus::failed;
+    std::fill_n(memory_.get() + size_, spareBytes, '\0');
+    return QvStatus::ok;
 }
 
 SubtitleMark findMark(std::string_view bytes) {

@@ -7,18 +7,23 @@
 #include <string_view>
 
 class Any;
+class QvByteSource;
 
 // A file's bytes, followed by four zeros.
 class SubtitleBytes {
   public:
     // 0, or -1; want of memory is logged.
     int read(const Any& filename);
+    // From where the source is to its end, which it has to reach.
+    int read(QvByteSource& source);
     std::string_view view() const { return {memory_.get(), size_}; }
 
   private:
     struct Release {
         void operator()(char* memory) const;
     };
+    int allocate(long long bytes);
+
     std::unique_ptr<char, Release> memory_;
     std::size_t size_ = 0;
 };
