@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <array>
+#include <cerrno>
 #include <cmath>
 #include <cstdint>
 #include <cstring>
@@ -101,9 +102,10 @@ int QvLoudness::init(int channels, int samplerate, long long channelMask) {
     *state_ = {};
     if (channels < 1 || channels > maxChannels || samplerate < 1) return QvStatus::invalidArgument;
     constexpr int modes = EBUR128_MODE_I | EBUR128_MODE_LRA | EBUR128_MODE_TRUE_PEAK;
+    errno = 0;  // nothing else tells why there is no meter
     state_->meter.reset(
         ebur128_init(static_cast<unsigned>(channels), static_cast<unsigned long>(samplerate), modes));
-    if (!state_->meter) return QvStatus::invalidArgument;
+    if (!state_->meter) return errno == ENOMEM ? QvStatus::outOfMemory : QvStatus::invalidArgument;
     if (const auto mask = static_cast<unsigned>(channelMask))
         mapByMask(*state_->meter, channels, mask);
     else

@@ -121,7 +121,7 @@ int QvPcm::grow(int n) {
     checkInited();
     const long long size = static_cast<long long>(size_) + n;
     if (!fits(size)) return QvStatus::outOfMemory;
-    QV_ASSERT(resize(static_cast<int>(size)));
+    QV_ASSERT_MEMORY(resize(static_cast<int>(size)), nullptr);
     return size_;
 }
 

@@ -4,6 +4,7 @@
 #include <cmath>
 #include <cstdlib>
 #include <memory>
+#include <new>
 
 #include "tarsel/commands/commands.h"
 #include "tarsel/commands/savedpicture.h"
@@ -55,7 +56,7 @@ class Pictures {
         if (source_.decoder().nrStreams(1) == 0) throw failure(Msg::fileNoPicture, {name});
         source_.selectAll();
         if (const std::string damage = source_.damage(); !damage.empty())
-            throw failure(Msg::inputDamaged, {name, damage});
+            throw failure(Msg::fileDamaged, {name, damage});
         reader_ = std::make_unique<PictureReader>(source_, effects_);
     }
     const std::string& name() const { return source_.name(); }
@@ -143,7 +144,7 @@ std::vector<Measured> worstOf(const std::vector<Measured>& all) {
 }
 
 void drawDifference(const QvFrame& a, const QvFrame& b, QvFrame& out) {
-    out.init(QvFourcc::BGR3, a.width(), a.height());
+    if (out.init(QvFourcc::BGR3, a.width(), a.height()) != QvStatus::ok) throw std::bad_alloc();
     for (int y = 0; y < a.height(); ++y) {
         const unsigned char *left = a.pixelPtr(0, y), *right = b.pixelPtr(0, y);
         unsigned char* const to = out.pixelPtr(0, y);

@@ -5,6 +5,7 @@
 #include <cmath>
 #include <cstdio>
 #include <filesystem>
+#include <new>
 
 #include "tarsel/commands/commands.h"
 #include "tarsel/commands/outputoptions.h"
@@ -107,6 +108,7 @@ void save(const QvFrame& picture, const Given& given) {
     if (picture.four_cc() != QvFourcc::BGR3) makeAnyCodec("scaler", kVideoFilter);  // says that it is missing
     errno = 0;
     if (QvImage::saveFrame(picture, Any(name.c_str()), 0) != 0) {
+        if (errno == ENOMEM) throw std::bad_alloc();
         if (errno != 0) throw systemFailure(Msg::outputSystem, given.output, errno);
         throw failure(Msg::outputRefused, {given.output, "the picture can't be converted to a PNG"});
     }
@@ -126,7 +128,9 @@ void saveSheet(const Source& source, PictureReader& reader, const Given& given) 
     const int width = ((kSheetWidth - kGap) / grid.width - kGap) & ~1;
     const int height = std::max(2, static_cast<int>(std::lround(width / reader.format().aspect)) & ~1);
     QvFrame sheet;
-    sheet.init(QvFourcc::BGR3, grid.width * (width + kGap) + kGap, grid.height * (height + kGap) + kGap);
+    if (sheet.init(QvFourcc::BGR3, grid.width * (width + kGap) + kGap,
+                   grid.height * (height + kGap) + kGap) != QvStatus::ok)
+        throw std::bad_alloc();
     sheet.setRGB(24, 24, 24);
     PictureConverter shrinker(width, height, QvFourcc::BGR3, "--sheet");
     const int count = grid.width * grid.height;
@@ -166,7 +170,7 @@ void frame(Given& given) {
     given.stream = StreamOutput::find(given.output, {given.input});
     const Any extension = QvFile::getExt(Any(given.output.c_str()), true);
     if (!given.stream) requireNoFolder(given.output, "png");
-    if (!given.stream && !(extension == "png")) throw failure(Msg::pictureName, {given.output});
+    if (!given.stream && !(extension == "png")) throw failure(Msg::pictureName, {"-o", given.output});
     if (!given.stream && NumberedName::parse(fs::path(given.output).filename().string()))
         throw failure(Msg::pictureNumbered, {given.output});
     Source source(given.input, given.raw);

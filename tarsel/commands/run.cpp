@@ -4,8 +4,10 @@
 #include "tarsel/commands/progressoption.h"
 #include "tarsel/host/console.h"
 #include "tarsel/host/events.h"
+#include "tarsel/host/outputs/streamoutput.h"
 #include "tarsel/host/signals.h"
 #include "tarsel/job/job.h"
+#include "tarsel/job/task/taskfilters.h"
 #include "tarsel/job/task/taskplan.h"
 #include "tarsel/words/commandline.h"
 #include "tarsel/words/messages.h"
@@ -21,15 +23,23 @@ struct Given {
     bool allowPost = false;
 };
 
+bool isNullDevice(const std::string& output) {
+    const auto stream = output.empty() ? nullptr : StreamOutput::find(output, {});
+    return stream && stream->discards();
+}
+
 // What the command line says for a job, the task says here.
 std::unique_ptr<StoredTask> openTask(const Given& given, JobOptions& job) {
     auto task = std::make_unique<StoredTask>(given.task);
+    job.output = given.output.empty() ? task->output() : given.output;
+    checkTaskFilters(*task, job.acceptPartial);
+    // A multiplexer that goes back to its header can't write there.
+    if (isNullDevice(job.output)) task->discardOutput();
     task->open();
     const QvMuxer* const muxer = task->task().encoder()->getMuxer();
     job.kind = taskOutputKind(*task);
     job.muxer = muxer ? muxer->name() : "nullmux";
     job.inputs = task->inputs();
-    job.output = given.output.empty() ? task->output() : given.output;
     job.splitChannels = job.muxer == "rawmux" && muxer->QvCodec::getParam("splitAudio").isTrue();
     return task;
 }
@@ -50,6 +60,8 @@ void run(Given& given, Signals& signals) {
         JobOptions job = given.job;
         auto task = openTask(given, job);
         job.post = commandOf(given, *task);
+        for (const std::string& log : task->qualityLogs())
+            job.warnings.push_back(lineOf(Msg::taskLogLeft, {given.task, log}));
         return std::make_unique<Job>(job, std::move(task), signals);
     });
 }

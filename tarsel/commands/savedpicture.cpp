@@ -1,6 +1,7 @@
 #include "tarsel/commands/savedpicture.h"
 
 #include <cerrno>
+#include <new>
 
 #include <qvplugcore/qvplugcore.h>
 
@@ -14,7 +15,7 @@ SavedPicture::SavedPicture(const std::string& name, const std::string& option,
                            Signals& signals)
     : name_(name), signals_(signals) {
     requireNoFolder(name, "png");
-    if (!(QvFile::getExt(Any(name.c_str()), true) == "png")) throw failure(Msg::pictureName, {name});
+    if (!(QvFile::getExt(Any(name.c_str()), true) == "png")) throw failure(Msg::pictureName, {option, name});
     outputs_ = std::make_shared<Outputs>(name, option, inputs, options.policy());
 }
 
@@ -25,6 +26,7 @@ void SavedPicture::save(const QvFrame& picture) {
     const std::string file = outputs_->begin("png");
     errno = 0;
     if (QvImage::saveFrame(picture, Any(file.c_str()), 0) != 0) {
+        if (errno == ENOMEM) throw std::bad_alloc();
         if (errno != 0) throw systemFailure(Msg::outputSystem, name_, errno);
         throw failure(Msg::outputRefused, {name_, "the picture can't be converted to a PNG"});
     }

@@ -86,7 +86,7 @@ void scope(Given& given) {
     if (source.decoder().nrStreams(1) == 0) throw failure(Msg::fileNoPicture, {given.input});
     source.selectAll();
     if (const std::string damage = source.damage(); !damage.empty())
-        throw failure(Msg::inputDamaged, {given.input, damage});
+        throw failure(Msg::fileDamaged, {given.input, damage});
     EffectOptions effects;
     PictureReader reader(source, effects);
     const auto rate = source.frameRate();

@@ -3,9 +3,11 @@
 #include "tarsel/host/files.h"
 #include "tarsel/words/messages.h"
 
-InputLengths::InputLengths(std::span<const std::unique_ptr<Source>> sources) {
+InputLengths::InputLengths(std::span<const std::unique_ptr<Source>> sources,
+                           std::span<const std::string> segments) {
     for (const auto& source : sources)
         if (source->isFile()) rows_.push_back({source->name(), fileBytes(source->name())});
+    for (const std::string& segment : segments) rows_.push_back({segment, fileBytes(segment)});
 }
 
 void InputLengths::check(bool again) const {

@@ -21,8 +21,8 @@ class InputShrank : public Failure {
 class InputLengths {
   public:
     InputLengths() = default;
-    // As they are now.
-    explicit InputLengths(std::span<const std::unique_ptr<Source>> sources);
+    // As they are now. `segments`: the files of a join, which is one source.
+    InputLengths(std::span<const std::unique_ptr<Source>> sources, std::span<const std::string> segments);
 
     // Throws InputShrank, or Failure if the job can't be run again: what a device or a pipe has got can't be
     // taken back.

@@ -9,6 +9,7 @@
 #include "tarsel/job/outputpipe.h"
 #include "tarsel/job/savedtask.h"
 #include "tarsel/job/task/joinplanner.h"
+#include "tarsel/job/task/taskfilters.h"
 #include "tarsel/job/task/taskplan.h"
 #include "tarsel/job/task/tasktext.h"
 #include "tarsel/sound/channelmap.h"
@@ -36,12 +37,15 @@ Job::Job(const JobOptions& options, std::unique_ptr<StoredTask> task, Signals& s
       parts_{{}, task->sources(), JobOutputs(options_), task->takePipe(), nullptr},
       warnings_(options.warnings) {
     parts_.stored = std::move(task);
-    begin(planTask(*parts_.stored, parts_.outputs.form(), readInputs(), options_.acceptPartial));
+    JobPlan plan = planTask(*parts_.stored, parts_.outputs.form(), readInputs(), options_.acceptPartial);
+    plan.filterFiles.read = filesOfFilters(*parts_.stored);
+    begin(std::move(plan));
 }
 
 void Job::begin(JobPlan plan) {
     parts_.plan = std::move(plan);
-    lengths_ = InputLengths(parts_.sources);
+    const bool joins = parts_.stored && parts_.stored->isJoin();
+    lengths_ = InputLengths(parts_.sources, joins ? parts_.stored->inputs() : std::vector<std::string>());
     warnings_.add(parts_.plan.warnings);
     warnings_.addEngine([this](const std::string& text) { return parts_.outputs.withFinalNames(text); });
     if (parts_.pipe)

@@ -226,13 +226,24 @@ void setStyle(QvCodec& filter, const std::string& key, const std::string& value,
     if (key == "wrap") setChecked(filter, "wrap", parseSwitch(value, what), what);
 }
 
+struct SubtitleFacts {
+    QvSubtitleFindings findings;
+    int readable = 0;  // subtitles
+};
+
 // Reads the file as the filter will.
+SubtitleFacts readSubtitles(const std::string& file, const QvCodec& filter) {
+    SubtitleFacts facts;
+    QvSubtitles subtitles;
+    subtitles.readFile(Any(file.c_str()), QvFramerate(QvRatio(25, 1)), filter.getParam("encoding").toInt32(),
+                       facts.findings);
+    facts.readable = subtitles.nrSubtitles();
+    return facts;
+}
+
 void checkSubtitles(const std::string& file, const QvCodec& filter, bool acceptPartial) {
     using Findings = QvSubtitleFindings;
-    QvSubtitles subtitles;
-    Findings found;
-    subtitles.readFile(Any(file.c_str()), QvFramerate(QvRatio(25, 1)), filter.getParam("encoding").toInt32(),
-                       found);
+    const auto [found, readable] = readSubtitles(file, filter);
     const std::string line = std::to_string(found.line);
     if (found.problem == Findings::unreadable) throw failure(Msg::subtitlesOtherFile, {file});
     if (found.problem == Findings::noText) throw failure(Msg::subtitlesNoText, {file});
@@ -244,8 +255,31 @@ void checkSubtitles(const std::string& file, const QvCodec& filter, bool acceptP
     if (found.problem == Findings::otherEncoding)
         throw failure(Msg::subtitlesInOtherEncoding, {file, line, found.encoding});
     if (found.lost > 0)
-        throw failure(Msg::subtitlesLost, {file, std::to_string(found.lost),
-                                           std::to_string(found.lost + subtitles.nrSubtitles())});
+        throw failure(Msg::subtitlesLost,
+                      {file, std::to_string(found.lost), std::to_string(found.lost + readable)});
+}
+
+// Why the filter can't use the subtitles, where no option of the command line gave them; "" if it can.
+std::string subtitleFault(const std::string& file, const QvCodec& filter, bool acceptPartial) {
+    using Findings = QvSubtitleFindings;
+    const auto [found, readable] = readSubtitles(file, filter);
+    if (found.problem == Findings::unreadable) return "it is no subtitle file";
+    if (found.problem == Findings::noText) return "it is no text";
+    if (found.problem == Findings::unknownEncoding) return "its encoding can't be found out";
+    if (acceptPartial) return "";
+    if (found.problem == Findings::noSubtitles) return "it has no subtitles";
+    if (found.problem == Findings::otherEncoding)
+        return "line " + std::to_string(found.line) + " is not valid in its encoding";
+    if (found.lost == 0) return "";
+    return "the times of " + std::to_string(found.lost) + " of " + std::to_string(found.lost + readable) +
+           " subtitles can't be read";
+}
+
+std::string fileFault(const QvCodec& filter, const std::string& file, bool acceptPartial) {
+    const auto isParam = [&](const char* name) { return filter.getParam(name) == file.c_str(); };
+    if (isParam("font_filename")) return QvText::isFont(Any(file.c_str())) ? "" : "it is no font";
+    if (isParam("subtitle_filename")) return subtitleFault(file, filter, acceptPartial);
+    return "";
 }
 
 // Letters that stand out from any picture; a size of 0 is their usual one.
@@ -287,6 +321,13 @@ void setTimecode(QvCodec& filter, const std::string& key, const std::string& val
 }
 
 }  // namespace
+
+void requireFilterFile(const QvCodec& filter, const std::string& file, bool acceptPartial) {
+    requireInput(file);
+    if (isStill(file)) requirePicture(file);
+    if (const std::string fault = fileFault(filter, file, acceptPartial); !fault.empty())
+        throw failure(Msg::filterFileRefused, {filter.name(), file, fault});
+}
 
 AnyDict subtitleState(const std::string& file, const std::string& style, const PictureFormat& picture,
                       bool acceptPartial) {

@@ -15,6 +15,10 @@ AnyDict subtitleState(const std::string& file, const std::string& style, const P
 AnyDict timecodeState(const std::string& spec, const PictureFormat& picture, bool alone, bool atTop);
 AnyDict fadeState(const std::string& spec, const PictureFormat& picture, long long frames);
 
+// Throws Failure if `filter` reads `file` and can't use it: a picture, subtitles or a font. `acceptPartial`
+// as above.
+void requireFilterFile(const QvCodec& filter, const std::string& file, bool acceptPartial);
+
 // Whether the logo of --logo is a file with moving pictures.
 bool logoIsMoving(const std::string& spec);
 

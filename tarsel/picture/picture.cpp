@@ -466,6 +466,19 @@ void changeFilterFiles(FiltersState& filters, const OtherFile& other) {
     }
 }
 
+void visitFilterFiles(const FiltersState& filters, const FilterFileVisit& visit) {
+    const AnyVector names = filters.names();
+    for (int i = 0; i < filters.count(); ++i) {
+        const std::unique_ptr<QvCodec> filter(qv_registry()->newCodec(names.at(i).asString("")));
+        if (!filter || !filters.filterAt(i).get("_on").isTrue()) continue;
+        filter->restore(filters.filterAt(i));
+        changeFiles(*filter, [&](const std::string& file, const char*, bool writes) {
+            visit(*filter, file, writes);
+            return file;
+        });
+    }
+}
+
 FilterFiles filterFiles(const QvVProcessPipe& pipe) {
     FilterFiles files;
     for (int i = 0; i < pipe.nrFilters(); ++i) {

@@ -71,6 +71,9 @@ std::string filterFile(const QvCodec& filter, int guiControl);
 // Puts another name in the place of each file that filters read or write.
 using OtherFile = std::function<std::string(const std::string& file, const char* filter, bool writes)>;
 void changeFilterFiles(FiltersState& filters, const OtherFile& other);
+// Calls `visit` for each file that a filter which is on reads or writes.
+using FilterFileVisit = std::function<void(const QvCodec& filter, const std::string& file, bool writes)>;
+void visitFilterFiles(const FiltersState& filters, const FilterFileVisit& visit);
 
 // The files that the filters of a pipe have been given.
 struct FilterFiles {

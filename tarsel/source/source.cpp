@@ -2,9 +2,11 @@
 
 #include <algorithm>
 #include <cstdio>
+#include <new>
 
 #include "tarsel/host/events.h"
 #include "tarsel/host/files.h"
+#include "tarsel/host/memory.h"
 #include "tarsel/source/captionfile.h"
 #include "tarsel/source/picturefile.h"
 #include "tarsel/source/wavformat.h"
@@ -83,7 +85,9 @@ std::unique_ptr<QvCodec> makeAnyCodec(const std::string& module, int kind) {
     const QvModule* found = qv_registry()->module(module.c_str());
     if (!found || moduleKind(*found) != kind)
         throw failure(Msg::moduleUnknown, {module, suggestion(module, moduleNames(kind))});
+    const MemoryWatch memory;
     std::unique_ptr<QvCodec> codec(qv_registry()->newCodec(module.c_str()));
+    if (!codec && memory.ranOut()) throw std::bad_alloc();
     if (!codec) throw failure(Msg::moduleUnusable, {module});
     return codec;
 }

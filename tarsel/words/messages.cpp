@@ -76,6 +76,8 @@ constexpr Message kMessages[] = {
     {Msg::taskRefused,       Exit::input, "{file} is no sound task",                "{system}",                                              "correct it, or save it again with --save-task"},
     {Msg::taskManyStreams,   Exit::usage, "can't write {file}",                     "a stream takes one stream, and the task makes {text}",  "give -o the name of a file"},
     {Msg::taskPostLeft,      Exit::done,  "{file}",                                 "its command '{text}' is left out",                      "--allow-post runs it"},
+    {Msg::taskLogLeft,       Exit::done,  "{file}",                                 "its log of encoding quality {file} is left out",        "an application can write it"},
+    {Msg::taskFilterWrites,  Exit::input, "can't run {file}",                       "its filter {name} would write {file} anew in each segment", "take the filter out, and use it on the joined output"},
     {Msg::taskRelinkWrong,   Exit::usage, "{option}",                                 "{name} does not say which name takes whose place",      "give OLD=NEW"},
     {Msg::taskRelinkNothing, Exit::usage, "can't change {file}",                    "it names neither {file} nor anything in it",            "'tarsel task show' prints its names"},
     {Msg::taskRelinkWords,   Exit::usage, "{option}",                                 "it takes OLD=NEW and one task file",                    "give both, as in 'tarsel task relink old.wav=new.wav job.xml'"},
@@ -132,7 +134,7 @@ constexpr Message kMessages[] = {
     {Msg::dropFrameNone,          Exit::usage,  "{option}",                         "{name} is drop frame, which {text} frames a second don't have", "use ':' in place of ';'"},
     {Msg::frameTooLarge,          Exit::usage,  "{option}",                         "a frame of {text} is too large for the memory or this format", "give a smaller size"},
     {Msg::sheetFailed,            Exit::failed, "--sheet",                          "a picture can't be scaled: {system}",                          "give another sheet"},
-    {Msg::pictureName,            Exit::usage,  "-o {file}",                        "a picture is a .png file",                                     "give a name that ends in .png"},
+    {Msg::pictureName,            Exit::usage,  "{option} {file}",                    "a picture is a .png file",                                     "give a name that ends in .png"},
     {Msg::pictureFailed,          Exit::failed, "can't make the picture of {file}", "{system}",                                                     "choose another --at or --size; --log FILE keeps the details"},
     // sound
     {Msg::mapWrong,        Exit::usage,  "--map",                                               "{name} is no list of channels",                                         "use as 1,0 or 0+1,-,a:1.0"},

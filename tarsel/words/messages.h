@@ -76,6 +76,8 @@ enum class Msg : unsigned short {
     taskRefused,
     taskManyStreams,
     taskPostLeft,
+    taskLogLeft,
+    taskFilterWrites,
     taskRelinkWrong,
     taskRelinkNothing,
     taskRelinkWords,

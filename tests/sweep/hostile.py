@@ -25,6 +25,10 @@ def font():
     return pathlib.Path(found).read_bytes() if os.path.isfile(found) else b""
 
 
+def stored_task():
+    return jobs.inputs()["stored.xml"]
+
+
 def seeds():
     """Name, content, and the arguments that read it."""
     clip = ["frame", *jobs.CLIP]
@@ -39,6 +43,12 @@ def seeds():
         ("h.sub", SUB, [*clip, "--at", "0.2", "--subtitles", "h.sub", *shot]),
         ("h.scc", jobs.SCC, ["captions", "h.scc"]),
         ("h.yuv", jobs.pattern(64 * 48 * 3), ["transcode", "h.yuv", *jobs.RAW, "-o", "part.yuv", "-y"]),
+        ("h.xml", stored_task(), ["run", "h.xml", "-o", "part.yuv", "-y"]),
+        ("c.xml", stored_task(), ["task", "check", "c.xml"]),
+        ("s.xml", stored_task(), ["task", "show", "s.xml", "--json"]),
+        ("m.wav", jobs.wav(jobs.pattern(400)), ["loudness", "m.wav", "--json"]),
+        ("q.wav", jobs.wav(jobs.pattern(400)), ["transcode", "--join", "q.wav", "in.wav@0-0.01", "-o", "out.wav", "-y"]),
+        ("o.yuv", jobs.pattern(64 * 48 * 3), ["compare", "o.yuv", *jobs.CLIP, "--sheet", "shot.png", "-y"]),
         ("h.ttf", font(), [*clip, "--subtitles", "talk.srt", "--subtitle-style", "font=h.ttf", *shot]),
     ]
 

@@ -58,6 +58,10 @@ JOBS = [
         ["transcode", *CLIP, "--cut", "0-0.2", "--cut", "0.4-0.5", "--save-task", "joined.xml", "--relative",
          "-o", "joined.yuv", "-y"]),
     Job("run", ["run", "stored.xml", "-y"], ["transcode", *CLIP, "in3.wav", "-o", "out2.yuv", "-y"]),
+    Job("compare", ["compare", "clip.yuv", *CLIP, "--offset", "1", "--sheet", "worst.png", "-y"],
+        ["compare", "clip.yuv", *CLIP, "--sheet", "worst.png", "-y"]),
+    Job("scope", ["scope", *CLIP, "-o", "levels.png", "-y"],
+        ["scope", *CLIP, "--at", "0.4", "-o", "levels.png", "-y"]),
     Job("captions", ["captions", "one.scc", "--json"], stdout=True),
     Job("info", ["info", "in.wav", "talk.srt", "--json"], stdout=True),
 ]

@@ -9,6 +9,7 @@ INSTANTS = [n for n in NUMBERS if n not in ("-1", "-0")]  # these count from the
 CARD = jobs.card("-o", "card.yuv")
 SOUND = ["transcode", "in.wav", "-o", "out.wav", "-y"]
 CLIP = ["transcode", *jobs.CLIP, "-o", "part.yuv", "-y"]
+COMPARE = ["compare", "clip.yuv", *jobs.CLIP]
 FRAME = ["frame", *jobs.CLIP, "-o", "shot.png", "-y"]
 
 # The arguments before the option, the option, and its values. Each ends with status 2.
@@ -66,6 +67,19 @@ OTHERS = [
         "frconvert", "avol", "rawdump:file=.")),
     [*SOUND, "--post", "exit 7"], [*SOUND, "--save-task", "/nosuch/x.xml"], [*SOUND, "--save-task", "in.wav"],
     ["--log", "/nosuch/folder/log", *SOUND], ["--plugins", "/nosuch", *SOUND],
+    *(["transcode", "--join", *segments, "-o", "out.wav", "-y"] for segments in (
+        ["in.wav@"], ["in.wav@-"], ["in.wav@1-0"], ["in.wav@0-999999999999"], ["in.wav@nan-inf"], ["in.wav+"], ["+"],
+        ["@0-1"], ["in.wav+in.wav"], ["in.wav", "out.wav"], ["in.wav"] * 2000, ["clip.yuv"], ["mark.png"], ["."])),
+    *([*SOUND, "--cut", value] for value in ("", "-", "0", "0-0", "1-", "0-0.01-0.02", "x-y", "-1--2", "1e300-2e300")),
+    *(["run", "stored.xml", "-y", "-o", name] for name in (
+        "", ".", "-", "/dev/full", "/dev/null", "in.wav", "clip.yuv", "stored.xml", "nosuch/out.yuv", "%d%d.yuv")),
+    ["run", "."], ["run", "in.wav"], ["run", "nosuch.xml"], ["task", "relink", "=", "stored.xml"],
+    ["task", "relink", "clip.yuv=in.wav", "."], ["task", "check", "/dev/null"], ["task", "show", "clip.yuv"],
+    *([*COMPARE, *more] for more in (
+        ["--offset", "99999999999"], ["--offset", "x"], ["--min-psnr", "nan"], ["--min-psnr", "-1"], ["--sheet", "."],
+        ["--sheet", "clip.yuv"], ["--sheet", "nosuch/x.png"])),
+    ["compare", "in.wav", "in.wav"], ["scope", "in.wav"], ["scope", *jobs.CLIP, "--at", "nan"],
+    ["scope", *jobs.CLIP, "-o", "mark.png"], ["loudness", "clip.yuv"], ["loudness", "."], ["loudness", "nosuch.wav"],
     ["info"], ["info", "."], ["info", "/dev/null"], ["captions", "in.wav"], ["formats", "--nosuch"],
     [*SOUND, "--muxer", "nosuch"], ["recover", "/nosuch/folder"],
 ]

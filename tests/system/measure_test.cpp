@@ -70,13 +70,13 @@ TEST_F(Measure, LimitsAndWrongUseHaveTheirStatus) {
                 {{"--min-psnr", "much"}, {"--min-psnr", "a number from 0 to 1000"}},
                 {{"--offset", "x"}, {"--offset", "a whole number"}},
                 {{"--offset", "9"}, {"no picture of one"}},
-                {{"--sheet", "sheet.jpg"}, {".png"}},
+                {{"--sheet", "sheet.jpg"}, {"--sheet 'sheet.jpg'", ".png"}},
             });
     fails(2, asYuv({"compare", "a.yuv", "testgen:size=32x32,duration=1"}), {"64x48 and 32x32"});
     fails(3, asYuv({"compare", "a.yuv", "absent.yuv"}), {"absent.yuv"});
     folder.write("cut.yuv", flat({100}) + "x");
-    fails(3, asYuv({"compare", "a.yuv", "cut.yuv"}), {"cut.yuv"});
-    fails(3, asYuv({"scope", "cut.yuv"}), {"cut.yuv"});
+    for (const Words& command : {Words{"compare", "a.yuv"}, Words{"scope"}})
+        fails(3, asYuv(command + Words{"cut.yuv"}), {"'cut.yuv' is damaged", "copy or make it again"});
 }
 
 TEST_F(Measure, SheetsAndWaveformsArePictures) {

@@ -45,4 +45,27 @@ TEST_F(ShortMemory, EndsEveryFormOfOutputInOrder) {
     }
 }
 
+// Commands that measure meet the limit in libraries, too.
+TEST_F(ShortMemory, IsWhatCommandsThatMeasureSay) {
+    if (*QV_SANITIZE) GTEST_SKIP() << "a sanitizer takes more memory than any limit";
+    makeWav("in.wav", 200000);
+    makeYuv("in.yuv", 4);
+    const Words jobs[] = {{"loudness", "in.wav"},
+                          asYuv({"compare", "in.yuv", "in.yuv", "--sheet", "out.png"}),
+                          asYuv({"scope", "in.yuv", "-o", "out.png"}),
+                          asYuv({"frame", "in.yuv", "--sheet", "4x4", "-o", "out.png"})};
+    const std::set<std::string> inputs = listing();
+    for (const auto& job : jobs)
+        for (int kilobytes = 28000; kilobytes < 44000; kilobytes += 500) {
+            const Outcome o = under("-v " + std::to_string(kilobytes), job);
+            SCOPED_TRACE(job.front() + " with " + std::to_string(kilobytes) + " kB: " + o.err);
+            std::filesystem::remove(folder.file("out.png"));
+            EXPECT_EQ(listing(), inputs);
+            if (o.status == 0 || o.status == 127) continue;  // the loader's own
+            EXPECT_EQ(o.status, 1);
+            EXPECT_THAT(o.err, testing::AnyOf(testing::HasSubstr("out of memory"),
+                                              testing::HasSubstr("no thread could be started")));
+        }
+}
+
 }  // namespace

@@ -280,6 +280,12 @@ TEST_F(Signal, AnInputThatShrinksIsDamage) {
          44 + 1'600'000'000,
          44 + 4000,
          80 + 4000},
+        {{"transcode", "--join", "in.wav", "in.wav", "-o", "out.wav"},
+         "in.wav",
+         "out.wav",
+         44 + 1'600'000'000,
+         44 + 4000,
+         80 + 8000},
     };
     for (const auto& row : rows)
         for (const bool partial : {false, true}) {

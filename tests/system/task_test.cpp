@@ -136,8 +136,100 @@ TEST_F(Task, DamagedTasksAreRefusedByName) {
         fails(3, command + Words{"absent.xml"}, {"'absent.xml'", "no such file"});
         fails(3, command + Words{"in.wav"}, {"'in.wav' is no sound task"});
     }
+    std::string other = task;
+    const std::string stream = "<pair first=\"2\" second=\"0\"/>";
+    ASSERT_NE(other.find(stream), std::string::npos);
+    other.replace(other.find(stream), stream.size(), "<pair first=\"2\" second=\"7\"/>");
+    folder.write("other.xml", other);
+    fails(3, {"run", "other.xml", "-y"}, {"'other.xml' is no sound task", "audio stream 7 of", "not there;"});
     fails(2, {"task", "shwo", "job.xml"}, {"'shwo'", "did you mean 'show'?"});
     fails(2, {"task", "show", "job.xml", "job.xml"}, {"one task file"});
+}
+
+// `text` with `more` at the start of the first element `element` after each `key`.
+std::string inserted(std::string text, const std::string& key, const std::string& element,
+                     const std::string& more) {
+    for (size_t at = 0; (at = text.find("<key>" + key + "</key>", at)) != std::string::npos;) {
+        at = text.find(element, at) + element.size();
+        text.insert(at, more);
+        at += more.size();
+    }
+    return text;
+}
+
+// A task file can come from anywhere: whatever is in it, a run reads what it names and writes its outputs.
+TEST_F(Task, ARunWritesNothingButItsOutputs) {
+    makeYuv("clip.yuv", 20);
+    works(asYuv({"transcode", "--join", "clip.yuv@0-0.2", "clip.yuv@0.4-0.6", "--subtitles", "talk.srt", "-o",
+                 "out.raw", "--save-task", "join.xml"}));
+    works(asYuv(
+        {"transcode", "clip.yuv", "-o", "one.raw", "--subtitles", "talk.srt", "--save-task", "one.xml"}));
+    for (const char* task : {"join.xml", "one.xml"})
+        fails(4, {"run", task, "-o", "talk.srt", "-y"}, {"'talk.srt'", "also an input"});
+
+    const std::string dump =
+        "<dict name=\"rawdump\"><key>_front</key><i32>0</i32><key>_on</key><i32>1</i32>"
+        "<key>_position</key><i32>9</i32><key>state</key><dict><key>filename</key><str>clip.yuv</str></dict>"
+        "</dict>";
+    const std::string before = contents("clip.yuv");
+    for (const char* task : {"join.xml", "one.xml"}) {
+        folder.write("dump.xml", inserted(contents(task), "customFilters", "<vec>", dump));
+        EXPECT_NE(tarsel({"run", "dump.xml", "-y"}).status, 0) << task;
+        EXPECT_TRUE(contents("clip.yuv") == before) << task;
+    }
+    const std::string log =
+        "<key>qualityStats</key><vec><dict><key>filename</key><str>clip.yuv</str></dict></vec>";
+    folder.write("log.xml", inserted(contents("join.xml"), "process", "<dict>", log));
+    EXPECT_THAT(works({"run", "log.xml", "-y"}).err,
+                HasSubstr("log of encoding quality 'clip.yuv' is left out"));
+    EXPECT_EQ(tarsel({"run", "log.xml", "-y", "--strict"}).status, 1);
+    EXPECT_TRUE(contents("clip.yuv") == before);
+}
+
+TEST_F(Task, WhatFiltersReadIsCheckedBeforeTheRun) {
+    makeYuv("clip.yuv", 20);
+    works({"frame", "testgen:size=32x32", "-o", "mark.png"});
+    const Words effects{"--subtitles", "talk.srt", "--logo", "mark.png@2,2"};
+    works(asYuv({"transcode", "--join", "clip.yuv@0-0.2", "clip.yuv@0.4-0.6", "-o", "out.raw", "--save-task",
+                 "join.xml"}) +
+          effects);
+    works(asYuv({"transcode", "clip.yuv", "-o", "one.raw", "--save-task", "one.xml"}) + effects);
+    const std::string text = contents("talk.srt"), picture = contents("mark.png");
+    const struct {
+        const char* name;
+        std::string content;
+        Words parts;
+        bool partly;  // --accept-partial goes without
+    } rows[] = {
+        {"talk.srt", "nothing of the kind\n", {"'subtitle' can't use", "no subtitles"}, true},
+        {"talk.srt", text + "2\n00:00:xx,000 --> 00:00:02,000\nHo\n", {"the times of 1 of 2"}, true},
+        {"talk.srt", "", {"talk.srt'", "empty"}, false},
+        {"mark.png", picture.substr(0, 60), {"mark.png'", "damaged"}, false},
+        {"mark.png", text, {"mark.png'", "no PNG"}, false},
+    };
+    for (const auto& row : rows) {
+        SCOPED_TRACE(row.parts.back());
+        folder.write(row.name, row.content);
+        for (const char* task : {"join.xml", "one.xml"}) {
+            fails(3, {"run", task, "-y"}, row.parts);
+            EXPECT_EQ(tarsel({"run", task, "-y", "--accept-partial"}).status, row.partly ? 0 : 3) << task;
+        }
+        folder.write("talk.srt", text);
+        folder.write("mark.png", picture);
+    }
+    std::filesystem::remove(folder.file("talk.srt"));
+    for (const char* task : {"join.xml", "one.xml"})
+        fails(3, {"run", task, "-y"}, {"talk.srt'", "no such file"});
+}
+
+TEST_F(Task, TheNullDeviceTakesEveryForm) {
+    const Words forms[] = {{"out.avi"}, {"out.png"}, {"out.yuv"}, {"out.wav"}};
+    for (const Words& form : forms) {
+        works(Words{"transcode"} + kCard + Words{"--save-task", "job.xml", "-y", "-o"} + form);
+        const auto before = listing();
+        works({"run", "job.xml", "-o", "/dev/null"});
+        EXPECT_EQ(listing(), before) << form.front();
+    }
 }
 
 }  // namespace

@@ -29,6 +29,24 @@ struct OpenReport : QvFileOpenCb {
     }
 };
 
+const char* typeWord(int type) {
+    return type == qvVideoStream ? "video" : type == qvAudioStream ? "audio" : "subpicture";
+}
+
+// Null if it can't be opened.
+std::unique_ptr<QvDecodePipe> openFile(const QvTaskState& state, const Any& name) {
+    for (const Any& entry : state.inputFiles()) {
+        const QvTaskState::File file(entry.asDict());
+        if (!(file.filename() == name)) continue;
+        try {
+            return std::unique_ptr<QvDecodePipe>(QvDecFactory::restoreDecoder(name, file.decoder(), nullptr));
+        } catch (const QvAssertFailure&) {
+            return nullptr;
+        }
+    }
+    return nullptr;
+}
+
 std::string fromFolder(const std::string& name, const fs::path& folder) {
     const fs::path path(name);
     return path.is_absolute() ? name : (folder / path).lexically_normal().string();
@@ -76,6 +94,7 @@ StoredTask::StoredTask(const std::string& file) : name_(file) {
     const fs::path folder = fs::path(absoluteName(file)).parent_path();
     AnyDict state = raw_;
     changeTaskFiles(state, [&](const std::string& name, TaskFileUse) { return fromFolder(name, folder); });
+    qualityLogs_ = takeQualityLogs(state);
     state_ = QvTaskState(state);
 }
 
@@ -110,6 +129,28 @@ std::string StoredTask::postProcess() const { return state_.postprocessCommand()
 
 bool StoredTask::isJoin() const { return state_.nrSegments() != 1 || !state_.isSegmentEnabled(0); }
 
+void StoredTask::discardOutput() {
+    AnyDict encoder = state_.getDict("encoder");
+    encoder.set("muxer", Any(AnyDict("name", "nullmux")));
+    state_.set("encoder", encoder);
+}
+
+// The first stream that the task takes from an input which lacks it, as a sentence; "" if there is none.
+std::string StoredTask::missingStream() const {
+    const int streams = state_.encoder().nrStreams();
+    for (int segment = 0; segment < state_.nrSegments(); ++segment)
+        for (int i = 0; i < streams; ++i) {
+            const QvTaskState::Source source = state_.source(i, segment);
+            if (source.empty() || !state_.isSegmentEnabled(segment)) continue;
+            const auto decoder = openFile(state_, source.filename());
+            if (!decoder || source.number() < decoder->nrStreams(source.type())) continue;
+            return std::string("it takes ") + typeWord(source.type()) + " stream " +
+                   std::to_string(source.number()) + " of " +
+                   inQuotes(source.filename().toString().asString("")) + ", which is not there";
+        }
+    return "";
+}
+
 void StoredTask::open() {
     for (const std::string& name : inputs()) requireInput(name);
     const MemoryWatch memory;
@@ -123,12 +164,18 @@ void StoredTask::open() {
         else
             task_.reset(QvTask::fromState(state_, decoders_, &pipe, 0, &report, &error));
     } catch (const QvException&) {
-        error = "an input lacks what it takes from it";
+        error = Any();
     }
     pipe_.reset(pipe);
     if (!task_ && memory.ranOut()) throw std::bad_alloc();
     if (!report.file.empty()) throw failure(Msg::inputRefused, {report.file, report.reason});
-    if (!task_) throw failure(Msg::taskRefused, {name_, error.toString().asString("it can't be restored")});
+    if (!task_) {
+        // What the engine says of a stream that can't be linked is meant for programmers.
+        std::string reason = missingStream();
+        if (reason.empty() && isJoin()) reason = error.toString().asString("");
+        if (reason.empty()) reason = "an input can't give what the task takes from it";
+        throw failure(Msg::taskRefused, {name_, reason});
+    }
     task_->setPostprocessCommand(Any());  // a run of the engine would run it
 }
 

@@ -22,7 +22,7 @@ class StoredTask {
 
     // Of the file, for the first of these.
     const std::string& name() const { return name_; }
-    // As the file has it, but with absolute names.
+    // As the file has it, but with absolute names and without logs of encoding quality.
     const QvTaskState& state() const { return state_; }
     // As it is, without another folder's names in it.
     const AnyDict& raw() const { return raw_; }
@@ -30,12 +30,16 @@ class StoredTask {
     // The files that sources are read from, without generated ones, and the output; "" for none.
     std::vector<std::string> inputs() const;
     std::string output() const;
+    // The logs of encoding quality that the file asks for.
+    const std::vector<std::string>& qualityLogs() const { return qualityLogs_; }
     // The command that runs afterwards, with its placeholders; "" for none.
     std::string postProcess() const;
 
     // Whether it has several segments, or one that is switched off.
     bool isJoin() const;
 
+    // Before open: the task does its work and writes nothing.
+    void discardOutput();
     // Opens the inputs and makes the output, which opens nothing yet. The task has no command for afterwards
     // then: who wants it runs postProcess(). Throws Failure.
     void open();
@@ -46,7 +50,10 @@ class StoredTask {
     std::unique_ptr<QvEncodePipe> takePipe() { return std::move(pipe_); }
 
   private:
+    std::string missingStream() const;
+
     std::string name_;
+    std::vector<std::string> qualityLogs_;
     AnyDict raw_;
     QvTaskState state_;
     QvDPipeList decoders_;

@@ -1,5 +1,7 @@
 #include "tarsel/job/task/taskfiles.h"
 
+#include <algorithm>
+
 #include "tarsel/picture/picture.h"
 
 namespace {
@@ -81,4 +83,19 @@ void changeTaskFiles(AnyDict& state, const Change& other) {
     changeName(state, "filename", TaskFileUse::output, other);
     changeInside(state, "encoder",
                  [&](AnyDict& encoder) { changeName(encoder, "filename", TaskFileUse::output, other); });
+}
+
+std::vector<std::string> takeQualityLogs(AnyDict& state) {
+    std::vector<std::string> names;
+    const auto take = [&](AnyDict& process) {
+        for (const Any& log : process.getVector("qualityStats"))
+            if (const std::string name = log.isDict() ? narrow(log.asDict().get("filename")) : "";
+                std::find(names.begin(), names.end(), name) == names.end())
+                names.push_back(name);
+        process.remove("qualityStats");
+    };
+    changeEach(state, "streams", [&](AnyDict& stream) {
+        changeEach(stream, "sources", [&](AnyDict& source) { changeInside(source, "process", take); });
+    });
+    return names;
 }

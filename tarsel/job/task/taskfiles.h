@@ -3,6 +3,7 @@
 
 #include <functional>
 #include <string>
+#include <vector>
 
 #include <qvplugcore/qvplugcore.h>
 
@@ -17,3 +18,7 @@ enum class TaskFileUse {
 // source has none. The engine has to be started, as filters are asked which of their parameters are files.
 void changeTaskFiles(AnyDict& state,
                      const std::function<std::string(const std::string& name, TaskFileUse use)>& other);
+
+// Takes the logs of encoding quality out of a state and returns their names. Encoders write them in place,
+// over whatever is there.
+std::vector<std::string> takeQualityLogs(AnyDict& state);
