@@ -4,8 +4,8 @@
 #include <cstring>
 #include <unordered_map>
 
-#include "core/preset/pluginpresets_p.h"
 #include "core/preset/tables/codecpairs_p.h"
+#include "core/preset/tables/pluginpresets_p.h"
 #include "core/preset/tables/presetcolumns_p.h"
 #include "core/preset/tables/presetgroups_p.h"
 

@@ -1,10 +1,10 @@
 #include "core/preset/qvpreset.h"
 
 #include "core/arch/qvassert.h"
+#include "core/encode/pipeinfo_p.h"
 #include "core/encode/qvencodepipe.h"
 #include "core/engine/log/qvlog.h"
 #include "core/engine/modules/qvmodule.h"
-#include "core/preset/presetinfo_p.h"
 #include "core/preset/presettrial_p.h"
 #include "core/preset/qvpresetmgr.h"
 #include "core/preset/qvprofile.h"
@@ -17,6 +17,26 @@ AnyVector nameList(const Any& names) {
     AnyVector list;
     if (names.isString()) list.append(names);
     return list;
+}
+
+// The names of modules in a preset that no pipe can show.
+std::string storedInfo(const AnyDict& preset) {
+    static constexpr const char* rows[][2] = {{"Format: %s", "muxer.name"},
+                                              {"Video: %s", "streams.vids.0.codec.name"},
+                                              {"Audio: %s", "streams.auds.0.codec.name"}};
+    AnyVector parts;
+    for (const auto& [form, path] : rows)
+        if (const Any* name = preset.descendant("%s", path); name && name->isText())
+            parts.append(Any::sprintf(form, name->toString().asString("")));
+    return parts.empty() ? "Info not available" : parts.join("; ").asString("");
+}
+
+// A stored profile number that is `from` becomes none; false if it is another one.
+bool moveToNone(AnyDict& settings, int from) {
+    if (!settings.isSet("profile")) return true;
+    if (!(settings.get("profile") == from)) return false;
+    settings.set("profile", QvProfile::none);
+    return true;
 }
 
 }  // namespace
@@ -122,20 +142,8 @@ void QvPreset::createInfo(const QvEncodePipe* pipe) {
         else if (const PresetTrial trial(*this); trial.pipe)
             text = qvPipeInfo(*trial.pipe);
     }
-    set("info", (text.empty() ? qvStoredInfo(*this) : text).c_str());
+    set("info", (text.empty() ? storedInfo(*this) : text).c_str());
 }
-
-namespace {
-
-// A stored profile number that is `from` becomes none; false if it is another one.
-bool moveToNone(AnyDict& settings, int from) {
-    if (!settings.isSet("profile")) return true;
-    if (!(settings.get("profile") == from)) return false;
-    settings.set("profile", QvProfile::none);
-    return true;
-}
-
-}  // namespace
 
 QvPreset QvPreset::toNone(int) const {
     QV_ASSERT_MSG(isCustom(), "QvPreset.toNone: allowed only for user presets");

@@ -15,6 +15,8 @@ constexpr int kOldest[] = {100, 1,  1,  2,  10, 10, 18, 19, 12, 15, 13, 17, 16, 
                            30,  31, 32, 40, 40, 50, 50, 51, 52, 53, 60, 60, 61, 62};
 static_assert(std::size(kOldest) == 28);
 
+static_assert(QvProfile::firstOfPlugins == profileScheme::firstOfPlugins);
+
 template <class Match>
 const ProfileSymbol* find(Match match) {
     for (const std::span<const ProfileSymbol> table :

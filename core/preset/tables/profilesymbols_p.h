@@ -10,6 +10,7 @@ struct ProfileSymbol {
 };
 
 namespace profileScheme {
+constexpr int firstOfPlugins = 0x2800000;
 constexpr int second(int member) { return 0x1000000 | member; }
 constexpr int current(int family, int member) { return family << 16 | member; }
 constexpr int familyOf(int profile) { return profile >> 16; }

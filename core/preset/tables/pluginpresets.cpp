@@ -1,4 +1,4 @@
-#include "core/preset/pluginpresets_p.h"
+#include "core/preset/tables/pluginpresets_p.h"
 
 #include <algorithm>
 #include <optional>
@@ -8,7 +8,7 @@
 #include "core/engine/modules/qvmodule.h"
 #include "core/engine/modules/qvplugin.h"
 #include "core/engine/modules/qvregistry.h"
-#include "core/preset/qvprofile.h"
+#include "core/preset/tables/profilesymbols_p.h"
 #include "core/value/utf.h"
 
 namespace {
@@ -72,8 +72,8 @@ std::optional<PluginPreset> PresetReader::read(const Any& entry, int nr) {
     const auto name = nameOf(dict.get("name")), group = nameOf(dict.get("group"));
     if (!name) return refuse(nr, "'name' is no text of one line");
     if (!group) return refuse(nr, "'group' is no text of one line");
-    const int profile = dict.getInt32("profile", QvProfile::notSet);
-    if (profile < QvProfile::firstOfPlugins) return refuse(nr, "'profile' is not a number of a plug-in");
+    const int profile = dict.getInt32("profile", -1);
+    if (profile < profileScheme::firstOfPlugins) return refuse(nr, "'profile' is not a number of a plug-in");
     const auto video = column(dict, "video"), audio = column(dict, "audio"), muxers = column(dict, "muxers");
     if (!video || !audio || !muxers)
         return refuse(nr, "'video', 'audio' and 'muxers' must be vectors of names");
@@ -91,6 +91,12 @@ std::optional<PluginPreset> PresetReader::read(const Any& entry, int nr) {
     return preset;
 }
 
+bool holdsName(const AnyVector& presets, const std::string& name) {
+    return std::any_of(presets.begin(), presets.end(), [&](const Any& preset) {
+        return preset.isDict() && preset.asDict().get("name") == name.c_str();
+    });
+}
+
 bool isEncoder(const QvModule& module) {
     const int type = module.getAttr("type").asInt32(0);
     return type == QvModuleType::videoEncoder || type == QvModuleType::audioEncoder;
@@ -98,7 +104,7 @@ bool isEncoder(const QvModule& module) {
 
 }  // namespace
 
-std::vector<PluginPreset> qvPluginPresets(const QvPresetList& taken, const CodecCompat& pairs,
+std::vector<PluginPreset> qvPluginPresets(const AnyVector& taken, const CodecCompat& pairs,
                                           const InstalledModules& installed) {
     std::vector<PluginPreset> found;
     const QvRegistry& registry = *qv_registry();
@@ -117,7 +123,7 @@ std::vector<PluginPreset> qvPluginPresets(const QvPresetList& taken, const Codec
             const auto holds = [&](auto same) { return std::any_of(found.begin(), found.end(), same); };
             if (holds([&](const PluginPreset& other) { return other.profile == preset->profile; }))
                 reader.refuse(nr, "its number is taken");
-            else if (taken.indexOfName(preset->name.c_str()) >= 0 ||
+            else if (holdsName(taken, preset->name) ||
                      holds([&](const PluginPreset& other) { return other.name == preset->name; }))
                 reader.refuse(nr, "its name is taken");
             else

@@ -7,8 +7,8 @@
 #include <vector>
 
 #include "core/engine/modules/codeccompat.h"
-#include "core/preset/qvpreset.h"
 #include "core/preset/tables/modulenames_p.h"
+#include "core/value/anycontainer.h"
 
 // One preset, its columns reduced to the modules that are installed.
 struct PluginPreset {
@@ -20,9 +20,9 @@ struct PluginPreset {
     AnyVector muxers;  // each goes with one of the video encoders, or of the audio encoders without these
 };
 
-// Those of all plug-ins in load order for which modules are installed. Neither number nor name is one of
-// `taken`, and no two are the same.
-std::vector<PluginPreset> qvPluginPresets(const QvPresetList& taken, const CodecCompat& pairs,
+// Those of all plug-ins in load order for which modules are installed. No number is used twice, and
+// no name, those of the presets in `taken` included.
+std::vector<PluginPreset> qvPluginPresets(const AnyVector& taken, const CodecCompat& pairs,
                                           const InstalledModules& installed);
 
 // Adds the pairs that encoders name and whose multiplexer is installed.
