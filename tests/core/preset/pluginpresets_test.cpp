@@ -127,4 +127,24 @@ TEST_F(PluginPresets, IllFormedPairsAreIgnoredWithALine) {
     EXPECT_FALSE(qvPresetMgr()->isCompatible("av1venc", "webmmux"));
 }
 
+// An encoder without its hardware, and a multiplexer that can't be made; each comes first in the list.
+TEST_F(PluginPresets, PipesBeginWithTheRawPresetWhereTheFirstCantBeMade) {
+    struct Unmade : QvModule {
+        Unmade(int type, const char* name) : QvModule(type, name, "", name) {}
+        QvCodec* create() override { return nullptr; }
+    };
+    modules.plugin().addModule(new Unmade(QvModuleType::videoEncoder, "bch264venc"));
+    for (const char* muxer : {"", "mp4mux"}) {
+        if (*muxer) modules.plugin().addModule(new Unmade(QvModuleType::muxer, muxer));
+        qvPresetMgr()->update();
+        ASSERT_EQ(wordsOf(list().preset(0).muxers()), *muxer ? "mp4mux rawmux" : "rawmux");
+        LogCapture log;
+        const std::unique_ptr<QvEncodePipe> pipe(QvEncodePipe::create());
+        ASSERT_TRUE(pipe);
+        EXPECT_TRUE(log.contains("[Encode Pipe] The first preset can't be applied"));
+        EXPECT_EQ(pipe->activePreset()->profile(), QvProfile::raw);
+        EXPECT_TRUE(pipe->nrStreams() == 2 && !*pipe->errorDesc());
+    }
+}
+
 }  // namespace
