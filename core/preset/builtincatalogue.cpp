@@ -21,16 +21,13 @@ AnyVector listOf(const Range& names) {
     return list;
 }
 
-// What one of these modules would bring: an encoder if there is none, else a multiplexer that takes it.
-AnyVector waitsFor(const PresetFamily& family, const PresetColumns& columns) {
-    return columns.video.empty() ? listOf(family.video) : listOf(qvFamilyMuxers(family));
-}
-
-void noteMissing(BuiltinCatalogue& catalogue, const PresetFamily& family, const PresetColumns& columns) {
-    for (const FamilyMember& member : family.presets())
-        catalogue.missing.append(AnyDict("profile", member.profile, "name", member.name, "group",
-                                         BuiltinCatalogue::groupOf(member.profile), "waitsFor",
-                                         waitsFor(family, columns)));
+// The name of a group of this library's presets, which need not be installed.
+const char* groupOf(int profile) {
+    for (const PresetGroupRow& row : qvPresetGroups()) {
+        const auto members = row.members();
+        if (std::find(members.begin(), members.end(), profile) != members.end()) return row.name;
+    }
+    return "";
 }
 
 // Indexes of the presets by their profiles.
@@ -64,12 +61,15 @@ int groupId(const PresetGroupList& groups, const char* name) {
 
 }  // namespace
 
-const char* BuiltinCatalogue::groupOf(int profile) {
-    for (const PresetGroupRow& row : qvPresetGroups()) {
-        const auto members = row.members();
-        if (std::find(members.begin(), members.end(), profile) != members.end()) return row.name;
+AnyVector BuiltinCatalogue::missingPresets() const {
+    AnyVector list;
+    for (const auto& [family, encoderInstalled] : missing) {
+        const AnyVector waitsFor = encoderInstalled ? listOf(qvFamilyMuxers(*family)) : listOf(family->video);
+        for (const FamilyMember& member : family->presets())
+            list.append(AnyDict("profile", member.profile, "name", member.name, "group",
+                                groupOf(member.profile), "waitsFor", waitsFor));
     }
-    return nullptr;
+    return list;
 }
 
 BuiltinCatalogue BuiltinCatalogue::make() {
@@ -80,7 +80,7 @@ BuiltinCatalogue BuiltinCatalogue::make() {
     for (const PresetFamily& family : qvPresetFamilies()) {
         const PresetColumns columns = qvPresetColumns(family, installed, catalogue.pairs);
         if (!columns.complete())
-            noteMissing(catalogue, family, columns);
+            catalogue.missing.push_back({&family, !columns.video.empty()});
         else
             for (const FamilyMember& member : family.presets())
                 catalogue.presets.append(

@@ -64,7 +64,7 @@ const PresetGroupList& QvPresetMgr::builtinGroups() const { return p_->builtin.g
 const QvPresetList& QvPresetMgr::extendedPresets() const { return p_->extended.presets; }
 QvPreset QvPresetMgr::extendedPreset(int index) const { return p_->extended.presets.preset(index); }
 const PresetGroupList& QvPresetMgr::extendedGroups() const { return p_->extended.groups; }
-AnyVector QvPresetMgr::missingPresets() const { return p_->builtin.missing; }
+AnyVector QvPresetMgr::missingPresets() const { return p_->builtin.missingPresets(); }
 const CodecCompat& QvPresetMgr::compatList() const { return p_->builtin.pairs; }
 
 void QvPresetMgr::clearExtendedPresets() {
