@@ -6,6 +6,7 @@
 #include "core/engine/modules/presethook_p.h"
 #include "core/engine/modules/qvmodule.h"
 #include "core/engine/modules/qvregistry.h"
+#include "core/engine/status.h"
 #include "core/preset/extendedpresets_p.h"
 #include "core/preset/qvprofile.h"
 #include "core/preset/qvuserpresets.h"
@@ -66,6 +67,16 @@ QvPreset QvPresetMgr::extendedPreset(int index) const { return p_->extended.pres
 const PresetGroupList& QvPresetMgr::extendedGroups() const { return p_->extended.groups; }
 AnyVector QvPresetMgr::missingPresets() const { return p_->builtin.missingPresets(); }
 const CodecCompat& QvPresetMgr::compatList() const { return p_->builtin.pairs; }
+
+int QvPresetMgr::loadExtendedPresets(const Any& source) {
+    // Adds to what was loaded before, under a new name where one is in use.
+    constexpr int mode = 6;
+    QvUserPresets read = p_->source;
+    if (const int result = read.load(source, mode)) return result;
+    p_->source = std::move(read);
+    p_->extend();
+    return QvStatus::ok;
+}
 
 void QvPresetMgr::clearExtendedPresets() {
     p_->source = QvUserPresets();

@@ -3,6 +3,7 @@
 #include "core/preset/extendedpresets_p.h"
 #include "core/preset/qvpresetmgr.h"
 #include "core/preset/qvprofile.h"
+#include "core/preset/qvuserpresets.h"
 #include "tests/support/checks.h"
 #include "tests/support/preset_modules.h"
 
@@ -71,6 +72,38 @@ TEST(ExtendedPresets, FollowTheBuiltinOnesInTheirGroups) {
     EXPECT_TRUE(log.contains("Skipped extended preset 'cinema', base profile not available."));
     EXPECT_EQ(log.count("Skipped"), 3) << "what has no number is skipped without a word";
     EXPECT_EQ(builtin.groups[builtin.groups.findByName("Flash")].size(), 2) << "unchanged";
+}
+
+TEST(ExtendedPresets, ComeFromFilesAndLastUntilTheyAreCleared) {
+    const PresetModules modules({"dvvenc", "dvmux"});
+    QvPresetMgr& catalogue = *qvPresetMgr();
+    const TempFolder folder;
+    QvUserPresets user;
+    QvPreset preset(qvSymToProfile("DVCPRO25"), "mine");
+    preset.set("PresetMeta", AnyDict("preferredGroup", "Uncompressed"));
+    user.append(preset);
+    user.append(QvPreset(qvSymToProfile("DV"), "second"));
+    const Any file = narrow(folder.file("more.xml"));
+    ASSERT_EQ(user.save(file), 0);
+
+    const int builtin = catalogue.builtinPresets().size();
+    for (const int loaded : {2, 4}) {
+        ASSERT_EQ(catalogue.loadExtendedPresets(file), 0);
+        EXPECT_EQ(catalogue.extendedPresets().size(), builtin + loaded);
+    }
+    EXPECT_STREQ(catalogue.extendedPreset(builtin + 2).name(), "mine (1)");
+    const auto& groups = catalogue.extendedGroups();
+    EXPECT_EQ(groups[groups.findByName("Uncompressed")].preset(2), builtin);
+    EXPECT_EQ(catalogue.builtinPresets().size(), builtin);
+
+    folder.write("broken.xml", "<QvUserPresets><presets>");
+    EXPECT_NE(catalogue.loadExtendedPresets(narrow(folder.file("broken.xml"))), 0);
+    EXPECT_NE(catalogue.loadExtendedPresets(narrow(folder.file("absent.xml"))), 0);
+    EXPECT_EQ(catalogue.extendedPresets().size(), builtin + 4) << "a failure changes nothing";
+    catalogue.update();
+    EXPECT_EQ(catalogue.extendedPresets().size(), builtin + 4) << "they are found a base again";
+    catalogue.clearExtendedPresets();
+    EXPECT_EQ(catalogue.extendedPresets(), catalogue.builtinPresets());
 }
 
 }  // namespace
