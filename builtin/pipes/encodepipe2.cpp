@@ -6,10 +6,12 @@
 #include "builtin/pipes/output/memberaddress.h"
 #include "builtin/pipes/output/outputanswers.h"
 #include "core/arch/qvassert.h"
+#include "core/arch/qvexception.h"
 #include "core/engine/log/qvlog.h"
 #include "core/engine/modules/params.h"
 #include "core/engine/modules/qvmodule.h"
 #include "core/preset/qvpresetmgr.h"
+#include "core/preset/qvprofile.h"
 
 namespace {
 
@@ -95,9 +97,26 @@ int EncodePipe2::init() {
     preset_.set(presets.preset(0));
     if (end_.setSink("filesink") != 0) return setError(QvStatus::failed, "Can not create file sink module.");
     adjustCodecToMuxer_ = true;
-    if (const int result = applyPreset(preset_.preset(), 0)) return result;
+    if (const int result = applyFirst(preset_.preset().profile())) return result;
     setState(stateInitialised);
     return QvStatus::ok;
+}
+
+// A module of a plug-in that can't be made, for want of its hardware or its licence, must not keep all other
+// outputs from being made: then the pipe begins with the raw preset of this library.
+int EncodePipe2::applyFirst(int profile) {
+    const bool canFallBack = profile != QvProfile::raw && qvPresetMgr()->profileAvailable(QvProfile::raw);
+    if (!canFallBack) return applyPreset(profile, 0);
+    try {
+        if (applyPreset(profile, 0) == QvStatus::ok) return QvStatus::ok;
+        qv_dbg()->warning("[Encode Pipe] The first preset can't be applied: %s", errorDesc());
+    } catch (const QvMemoryFailure&) {
+        throw;
+    } catch (const QvException& failure) {
+        qv_dbg()->warning("[Encode Pipe] The first preset can't be applied: %s", failure.what());
+    }
+    setError(QvStatus::ok, "%s", "");
+    return applyPreset(QvProfile::raw, 0);
 }
 
 void* EncodePipe2::getInterface(int kind) const {

@@ -96,6 +96,7 @@ class EncodePipe2 : public QvEncodePipe, public QvIProgramSetup, private PipeHos
     const void* pipe() const override { return this; }
     void storeFailure(int code, const char* text) override { setError(code, "%s", text); }
 
+    int applyFirst(int profile);
     int finish(bool aborting);
     int refuseWhileOpen();
     int setMember(const char* name, const Any& value);

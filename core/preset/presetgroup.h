@@ -49,5 +49,8 @@ class QV_API PresetGroupList {
     void clear() { groups_.clear(); }
 
   private:
+    template <class Match>
+    int find(int from, Match match) const;
+
     std::vector<PresetGroup> groups_;
 };

@@ -1,14 +1,15 @@
 #include "core/preset/qvpreset.h"
 
 #include "core/arch/qvassert.h"
+#include "core/encode/pipeinfo_p.h"
+#include "core/encode/qvencodepipe.h"
 #include "core/engine/log/qvlog.h"
+#include "core/engine/modules/qvmodule.h"
+#include "core/preset/presettrial_p.h"
 #include "core/preset/qvpresetmgr.h"
 #include "core/preset/qvprofile.h"
 
 namespace {
-
-constexpr int kVideoEncoderKind = 7;
-constexpr int kAudioEncoderKind = 6;
 
 // A list of module names out of a list or a single name.
 AnyVector nameList(const Any& names) {
@@ -16,6 +17,26 @@ AnyVector nameList(const Any& names) {
     AnyVector list;
     if (names.isString()) list.append(names);
     return list;
+}
+
+// The names of modules in a preset that no pipe can show.
+std::string storedInfo(const AnyDict& preset) {
+    static constexpr const char* rows[][2] = {{"Format: %s", "muxer.name"},
+                                              {"Video: %s", "streams.vids.0.codec.name"},
+                                              {"Audio: %s", "streams.auds.0.codec.name"}};
+    AnyVector parts;
+    for (const auto& [form, path] : rows)
+        if (const Any* name = preset.descendant("%s", path); name && name->isText())
+            parts.append(Any::sprintf(form, name->toString().asString("")));
+    return parts.empty() ? "Info not available" : parts.join("; ").asString("");
+}
+
+// A stored profile number that is `from` becomes none; false if it is another one.
+bool moveToNone(AnyDict& settings, int from) {
+    if (!settings.isSet("profile")) return true;
+    if (!(settings.get("profile") == from)) return false;
+    settings.set("profile", QvProfile::none);
+    return true;
 }
 
 }  // namespace
@@ -44,6 +65,16 @@ QvPreset::QvPreset(int profile, const char* name, const Any& video, const Any& a
     set("videoCodecs", nameList(video));
     set("audioCodecs", nameList(audio));
     set("muxers", nameList(muxers));
+}
+
+QvPreset::QvPreset(const QvEncodePipe* pipe, const char* name, bool) : QvPreset() {
+    QV_ASSERT(pipe && name);
+    pipe->storePreset(*this);
+    remove("presetName");  // of the preset that the pipe followed; this one has a name of its own
+    set("custom", 1);
+    set("name", name);
+    set("#valid", 1);
+    createInfo(pipe);
 }
 
 const char* QvPreset::name() const { return getString("name", "<invalid>"); }
@@ -89,14 +120,57 @@ const AnyDict* QvPreset::base() const {
     return nullptr;
 }
 
+bool QvPreset::isValid() { return isSet("#valid") ? get("#valid").isTrue() : checkValid(); }
+
+bool QvPreset::checkValid() {
+    QV_ASSERT_MSG(isSet("profile") && isSet("custom") && isSet("name"), "QvPreset: invalid object");
+    const std::string reason = isBuiltin() ? "" : qvWhyInvalid(*this);
+    if (reason.empty())
+        remove("#err");
+    else
+        set("#err", reason.c_str());
+    set("#valid", reason.empty() ? 1 : 0);
+    return reason.empty();
+}
+
+void QvPreset::createInfo(const QvEncodePipe* pipe) {
+    if (get("info").isText()) return;
+    std::string text;
+    if (isValid()) {
+        if (pipe)
+            text = qvPipeInfo(*pipe);
+        else if (const PresetTrial trial(*this); trial.pipe)
+            text = qvPipeInfo(*trial.pipe);
+    }
+    set("info", (text.empty() ? storedInfo(*this) : text).c_str());
+}
+
+QvPreset QvPreset::toNone(int) const {
+    QV_ASSERT_MSG(isCustom(), "QvPreset.toNone: allowed only for user presets");
+    QvPreset copy = *this;
+    const int from = profile();
+    moveToNone(copy, from);
+    if (Any& muxer = copy.get("muxer"); muxer.isDict()) moveToNone(muxer.asDict(), from);
+    if (Any& streams = copy.get("streams"); streams.isVector())
+        for (Any& stream : streams.asVector())
+            if (Any* codec = stream.isDict() ? &stream.asDict().get("codec") : nullptr;
+                codec && codec->isDict())
+                QV_ASSERT_MSG(moveToNone(codec->asDict(), from),
+                              "QvPreset.toNone: a stream has another profile");
+    // They belong to the former profile.
+    copy.remove("#valid");
+    copy.remove("#err");
+    return copy;
+}
+
 AnyVector QvPreset::allowed(const char* key) const {
     const AnyDict* source = isBuiltin() ? this : base();
     return source ? source->getVector(key, AnyVector()) : AnyVector();
 }
 
 AnyVector QvPreset::codecs(int kind) const {
-    QV_ASSERT(kind == kVideoEncoderKind || kind == kAudioEncoderKind);
-    return kind == kVideoEncoderKind ? videoCodecs() : audioCodecs();
+    QV_ASSERT(kind == QvModuleType::videoEncoder || kind == QvModuleType::audioEncoder);
+    return kind == QvModuleType::videoEncoder ? videoCodecs() : audioCodecs();
 }
 
 Any QvPreset::defaultMuxer() const {

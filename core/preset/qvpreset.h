@@ -16,6 +16,7 @@
 #include "core/value/anycontainer.h"
 
 class QvEncodePipe;
+struct BuiltinCatalogue;
 
 class QV_API QvPreset : public AnyDict {
   public:
@@ -55,7 +56,7 @@ class QV_API QvPreset : public AnyDict {
     void createInfo(const QvEncodePipe* pipe = nullptr);
 
     // A copy whose profile, and that of its streams and multiplexer, is QvProfile::none. A stream of another
-    // profile is an assertion. A built-in preset is an assertion too, and comes back as it is.
+    // profile is an assertion, and so is a built-in preset.
     QvPreset toNone(int = 0) const;
 
     // The modules that are allowed, by way of the base preset for a user's; empty when that is missing.
@@ -76,7 +77,7 @@ class QV_API QvPreset : public AnyDict {
     AnyVector getCompatible(const char* name, int kind) const;
 
   private:
-    friend class QvPresetMgr;
+    friend struct BuiltinCatalogue;  // which makes the built-in ones
     QvPreset(int profile, const char* name, const Any& video, const Any& audio, const Any& muxers);
 
     AnyVector allowed(const char* key) const;

@@ -1,58 +1,43 @@
 #include "core/preset/qvpresetmgr.h"
 
-#include <span>
 #include <string_view>
 
 #include "core/arch/qvassert.h"
 #include "core/engine/modules/presethook_p.h"
 #include "core/engine/modules/qvmodule.h"
 #include "core/engine/modules/qvregistry.h"
+#include "core/engine/status.h"
+#include "core/preset/extendedpresets_p.h"
 #include "core/preset/qvprofile.h"
+#include "core/preset/qvuserpresets.h"
+#include "core/preset/tables/codecpairs_p.h"
+
+struct QvPresetMgr::Private {
+    BuiltinCatalogue builtin;
+    QvUserPresets source;  // of the extended presets
+    ExtendedPresets extended;
+
+    void extend() { extended = ExtendedPresets::make(builtin, source); }
+    // The built-in preset of a profile of any scheme, or null.
+    const AnyDict* presetOf(int profile) const {
+        if (profile == QvProfile::notSet) return nullptr;
+        const int index = builtin.presets.indexOfProfile(qvFixOldProfileNo(profile));
+        return index < 0 ? nullptr : &builtin.presets.at(index).asDict();
+    }
+};
 
 namespace {
 
-constexpr int kMuxerKind = 10;
-
-// One built-in preset. Module names stand in the order of preference; those not installed drop out, and a
-// preset without any video encoder is left out.
-struct PresetRow {
-    int profile;
-    const char* name;
-    const char* video[3];
-    const char* audio[7];
-    const char* muxers[5];
-};
-
-constexpr PresetRow kPresets[] = {
-    {QvProfile::raw, "RAW/YUV", {"rawvenc"}, {"rawaenc"}, {"rawmux"}},
-    {QvProfile::aviRaw, "Uncompressed AVI", {"rawvenc"}, {"rawaenc"}, {"rawavimux"}},
-};
-
-struct CompatRow {
-    const char* codec;
-    const char* muxers[8];
-};
-
-constexpr CompatRow kCompatible[] = {
-    {"rawvenc", {"rawmux", "rawavimux"}},
-    {"rawaenc", {"rawmux", "rawavimux", "mvrawmux"}},
-};
-
-bool installed(const char* name) { return qv_registry()->module(name) != nullptr; }
-
-AnyVector installedOf(std::span<const char* const> names) {
-    AnyVector list;
-    for (const char* name : names)
-        if (name && installed(name)) list.append(Any(name));
-    return list;
+// Where a preset lists the modules of a kind.
+const char* columnOf(int kind) {
+    QV_ASSERT(kind == QvModuleType::videoEncoder || kind == QvModuleType::audioEncoder ||
+              kind == QvModuleType::muxer);
+    return kind == QvModuleType::videoEncoder   ? "videoCodecs"
+           : kind == QvModuleType::audioEncoder ? "audioCodecs"
+                                                : "muxers";
 }
 
 }  // namespace
-
-struct QvPresetMgr::Private {
-    QvPresetList builtin;
-    AnyDict compatible;  // encoder to the vector of its multiplexers
-};
 
 QvPresetMgr::QvPresetMgr() : p_(std::make_unique<Private>()) {}
 
@@ -70,60 +55,67 @@ const QvPresetHook& qvPresetHook() {
 }
 
 void QvPresetMgr::update() {
-    p_->builtin.clear();
-    for (const PresetRow& row : kPresets) {
-        const AnyVector video = installedOf(row.video);
-        if (video.empty()) continue;
-        p_->builtin.append(
-            QvPreset(row.profile, row.name, video, installedOf(row.audio), installedOf(row.muxers)));
-    }
-    p_->compatible.clear();
-    for (const CompatRow& row : kCompatible)
-        if (installed(row.codec)) p_->compatible.set(row.codec, installedOf(row.muxers));
+    p_->builtin = BuiltinCatalogue::make();
+    p_->extend();
 }
 
-const QvPresetList& QvPresetMgr::builtinPresets() const { return p_->builtin; }
+const QvPresetList& QvPresetMgr::builtinPresets() const { return p_->builtin.presets; }
+QvPreset QvPresetMgr::builtinPreset(int index) const { return p_->builtin.presets.preset(index); }
+const PresetGroupList& QvPresetMgr::builtinGroups() const { return p_->builtin.groups; }
+const QvPresetList& QvPresetMgr::extendedPresets() const { return p_->extended.presets; }
+QvPreset QvPresetMgr::extendedPreset(int index) const { return p_->extended.presets.preset(index); }
+const PresetGroupList& QvPresetMgr::extendedGroups() const { return p_->extended.groups; }
+AnyVector QvPresetMgr::missingPresets() const { return p_->builtin.missingPresets(); }
+const CodecCompat& QvPresetMgr::compatList() const { return p_->builtin.pairs; }
 
-QvPreset QvPresetMgr::builtinPreset(int index) const { return p_->builtin.preset(index); }
+int QvPresetMgr::loadExtendedPresets(const Any& source) {
+    // Adds to what was loaded before, under a new name where one is in use.
+    constexpr int mode = 6;
+    QvUserPresets read = p_->source;
+    if (const int result = read.load(source, mode)) return result;
+    p_->source = std::move(read);
+    p_->extend();
+    return QvStatus::ok;
+}
+
+void QvPresetMgr::clearExtendedPresets() {
+    p_->source = QvUserPresets();
+    p_->extend();
+}
 
 int QvPresetMgr::findByProfile(int profile) const {
-    QV_ASSERT(!p_->builtin.empty());
+    QV_ASSERT(!p_->builtin.presets.empty());
     if (profile == QvProfile::notSet) return -1;
-    return p_->builtin.indexOfProfile(qvFixOldProfileNo(profile));
+    return p_->builtin.presets.indexOfProfile(qvFixOldProfileNo(profile));
 }
 
 bool QvPresetMgr::isCompatible(const char* codec, const char* muxer) const {
-    const Any& muxers = p_->compatible.get(codec);
-    return muxers.isVector() && muxers.asVector().contains(Any(muxer));
+    return p_->builtin.pairs.isCompatible(codec, muxer);
 }
 
 bool QvPresetMgr::isCompatible(const char* codec, const char* muxer, int profile) const {
     if (!isCompatible(codec, muxer)) return false;
-    if (profile == QvProfile::notSet) return true;
-    const int index = p_->builtin.indexOfProfile(qvFixOldProfileNo(profile));
-    if (index < 0) return true;
-    const QvPreset preset = p_->builtin.preset(index);
-    return preset.videoCodecs().contains(Any(codec)) || preset.audioCodecs().contains(Any(codec)) ||
-           preset.muxers().contains(Any(codec));
+    if (const auto answer = qvPairByProfile(codec, muxer, profile)) return *answer;
+    const AnyDict* preset = p_->presetOf(profile);
+    if (!preset) return true;
+    const auto lists = [&](const char* key) { return preset->getVector(key).contains(Any(codec)); };
+    return lists("videoCodecs") || lists("audioCodecs") || lists("muxers");
 }
 
 AnyVector QvPresetMgr::getCompatible(const char* name, int kind, int profile) const {
-    AnyVector candidates;
-    const int index =
-        profile == QvProfile::notSet ? -1 : p_->builtin.indexOfProfile(qvFixOldProfileNo(profile));
-    if (index >= 0) {
-        const QvPreset preset = p_->builtin.preset(index);
-        candidates = kind == kMuxerKind ? preset.muxers() : preset.codecs(kind);
-    } else {
-        const AnyVector modules = qv_registry()->modules(kind);
-        for (int i = 0; i < modules.size(); ++i) candidates.append(modules.at(i).asDict().get("name"));
-    }
+    const AnyDict* preset = p_->presetOf(profile);
+    const auto fits = [&](const char* other) {
+        const bool ofMuxers = kind == QvModuleType::muxer;
+        const char *codec = ofMuxers ? name : other, *muxer = ofMuxers ? other : name;
+        return preset ? isCompatible(codec, muxer, profile) : isCompatible(codec, muxer);
+    };
     AnyVector list;
-    for (int i = 0; i < candidates.size(); ++i) {
-        const char* other = candidates.at(i).asString();
-        const bool fits =
-            kind == kMuxerKind ? isCompatible(name, other, profile) : isCompatible(other, name, profile);
-        if (fits) list.append(candidates.at(i));
+    if (preset) {
+        for (const Any& other : preset->getVector(columnOf(kind)))
+            if (fits(other.asString())) list.append(other);
+    } else {
+        for (const Any& module : qv_registry()->modules(kind))
+            if (const Any& other = module.asDict().get("name"); fits(other.asString())) list.append(other);
     }
     return list;
 }

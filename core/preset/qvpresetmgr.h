@@ -35,8 +35,8 @@ class QV_API QvPresetMgr {
     void clearExtendedPresets();
 
     // The presets of this library that are not here because no module makes their video, or no multiplexer
-    // takes it. Each is a dictionary: "profile", "name", "group" (a name) and "waitsFor", a vector of the
-    // names of the modules one of which would bring it.
+    // takes it. Each is a dictionary: "profile", "name", "group" (a name) and "waitsFor", a vector of module
+    // names of which one is needed: encoders, or multiplexers if an encoder is installed.
     AnyVector missingPresets() const;
 
     // Index of the built-in preset of a profile (of any scheme), -1 if there is none. Asserts before update.

@@ -4,35 +4,25 @@
 #include <iterator>
 #include <span>
 
+#include "core/preset/tables/profilesymbols_p.h"
+
 namespace {
 
-struct Symbol {
-    const char* name;
-    int number;
-};
-
-constexpr int second(int member) { return 0x1000000 | member; }
-
-constexpr Symbol kCurrent[] = {
-    {"RAW", QvProfile::raw},
-    {"AVI_RAW", QvProfile::aviRaw},
-};
-
-constexpr Symbol kSecond[] = {
-    {"NONE", second(100)},
-    {"RAW", second(101)},
-};
+using profileScheme::second;
 
 // Index: a number of the oldest scheme. Value: the member in the second one.
 constexpr int kOldest[] = {100, 1,  1,  2,  10, 10, 18, 19, 12, 15, 13, 17, 16, 30,
                            30,  31, 32, 40, 40, 50, 50, 51, 52, 53, 60, 60, 61, 62};
 static_assert(std::size(kOldest) == 28);
 
+static_assert(QvProfile::firstOfPlugins == profileScheme::firstOfPlugins);
+
 template <class Match>
-const Symbol* find(Match match) {
-    for (std::span<const Symbol> table :
-         {std::span<const Symbol>(kCurrent), std::span<const Symbol>(kSecond)})
-        for (const Symbol& row : table)
+const ProfileSymbol* find(Match match) {
+    for (const std::span<const ProfileSymbol> table :
+         {std::span<const ProfileSymbol>(profileScheme::currentSymbols),
+          std::span<const ProfileSymbol>(profileScheme::secondSymbols)})
+        for (const ProfileSymbol& row : table)
             if (match(row)) return &row;
     return nullptr;
 }
@@ -40,13 +30,13 @@ const Symbol* find(Match match) {
 }  // namespace
 
 int qvSymToProfile(const char* symbol) {
-    const Symbol* row =
-        symbol ? find([&](const Symbol& s) { return std::strcmp(s.name, symbol) == 0; }) : nullptr;
+    const ProfileSymbol* row =
+        symbol ? find([&](const ProfileSymbol& s) { return std::strcmp(s.name, symbol) == 0; }) : nullptr;
     return row ? row->number : QvProfile::notSet;
 }
 
 const char* qvProfileToSym(int profile) {
-    const Symbol* row = find([&](const Symbol& s) { return s.number == profile; });
+    const ProfileSymbol* row = find([&](const ProfileSymbol& s) { return s.number == profile; });
     return row ? row->name : "";
 }
 

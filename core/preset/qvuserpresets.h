@@ -59,12 +59,13 @@ class QV_API QvUserPresets : public QvPresetList {
 
     // Reads a file of either form: 0; -1 if it is no file of presets, or if an element of the older form
     // could not be read; the XML reader's code if it can't be read. `version` receives 1 or 2 for the form. A
-    // damaged element of the current form is an assertion: files that come from outside are looked at with
-    // check() first.
+    // damaged element of the current form is an assertion, and so is one of the older form without "params";
+    // the list is unchanged then. Files that come from outside are looked at with check() first.
     int load(const Any& file, int mode, int* version = nullptr);
     // Looks whether load() can read the file without an assertion: an empty text, or what is wrong with it.
+    // What a preset may not be named, where it replaces one of this list, is not looked at: see set().
     static std::string check(const Any& file);
-    // Writes the current form: 0, or the XML writer's code.
+    // Writes the current form: 0, or the XML writer's code. Throws as XmlParser::storeDict.
     int save(const Any& file);
 
     // Validates each preset and makes the "info" of the valid ones; returns how many those are.

@@ -8,6 +8,7 @@
 
 #include "core/decode/decodefactory.h"
 #include "core/decode/qvdecoder.h"
+#include "core/encode/qvencodepipe.h"
 #include "core/engine/modules/init.h"
 #include "core/engine/modules/qvcodec.h"
 #include "core/engine/modules/qvmodule.h"
@@ -16,6 +17,7 @@
 #include "core/engine/status.h"
 #include "core/filter/qvfilter.h"
 #include "core/media/qvbuffer.h"
+#include "core/preset/qvpresetmgr.h"
 #include "core/stream/qvbytesource.h"
 #include "tests/support/checks.h"
 
@@ -106,6 +108,29 @@ TEST_F(Plugins, DecoderAndFilterDoTheirWork) {
     ASSERT_TRUE(filter->write(pcm) == 0 && filter->samples() == 2);
     const auto* inverted = reinterpret_cast<const int*>(filter->pcm()->ptr(0));
     EXPECT_TRUE(inverted[0] == -1000 && inverted[1] == 2147483647);
+}
+
+TEST_F(Plugins, PresetsComeAndGoWithTheFile) {
+    bring("presets_plugin.so");
+    EXPECT_EQ(registry.scanFolder(narrow(folder.path().string())), 0);
+    const QvPresetMgr& catalogue = *qvPresetMgr();
+    ASSERT_EQ(catalogue.builtinPresets().size(), 5);
+    EXPECT_STREQ(catalogue.builtinPreset(0).name(), "H.264 / SVC");
+    EXPECT_TRUE(log.contains("[Preset] Plug-in 'presets': preset 2 left out"));
+    EXPECT_EQ(catalogue.builtinGroups().findByName("Sound"), 2);
+    EXPECT_EQ(catalogue.extendedGroups()[2].id(), 200);
+    {
+        const std::unique_ptr<QvEncodePipe> pipe(QvEncodePipe::create());
+        ASSERT_TRUE(pipe);
+        EXPECT_STREQ(pipe->videoEncoder(0)->name(), "svcvenc");
+        EXPECT_EQ(pipe->applyPreset(0x2800001, 0), 0) << pipe->errorDesc();
+        EXPECT_TRUE(pipe->nrVideoStreams() == 0 && pipe->nrAudioStreams() == 1);
+        const QvPreset preset(pipe.get(), "mine");
+        EXPECT_EQ(preset.defaultMuxer(), "rawmux");
+    }
+    cleanup_wrapper();
+    init_wrapper(nullptr);
+    EXPECT_EQ(catalogue.findByProfile(0x2800001), -1);
 }
 
 TEST_F(Plugins, BadFilesLeaveALineAndAReason) {

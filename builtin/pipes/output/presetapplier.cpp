@@ -1,6 +1,6 @@
 #include "builtin/pipes/output/presetapplier.h"
 
-#include <algorithm>
+#include <string_view>
 
 #include "builtin/pipes/output/members/pipehost.h"
 #include "core/engine/log/qvlog.h"
@@ -11,10 +11,9 @@
 
 namespace {
 
+// DVCPRO HD has an encoder and a multiplexer of its own, in whatever container.
 bool isDv100(int profile) {
-    constexpr const char* symbols[] = {"DVCPRO100_720p", "DVCPRO100_720p_NATIVE", "DVCPRO100_1080i"};
-    return std::any_of(std::begin(symbols), std::end(symbols),
-                       [profile](const char* symbol) { return qvSymToProfile(symbol) == profile; });
+    return std::string_view(qvProfileToSym(profile)).find("DVCPRO100") != std::string_view::npos;
 }
 
 }  // namespace

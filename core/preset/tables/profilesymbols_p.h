@@ -1,0 +1,182 @@
+// The symbols of profile numbers in both schemes that have them. The current one comes first in every lookup.
+#pragma once
+
+#include <iterator>
+#include <string_view>
+
+struct ProfileSymbol {
+    const char* name;
+    int number;
+};
+
+namespace profileScheme {
+constexpr int firstOfPlugins = 0x2800000;
+constexpr int second(int member) { return 0x1000000 | member; }
+constexpr int current(int family, int member) { return family << 16 | member; }
+constexpr int familyOf(int profile) { return profile >> 16; }
+
+// clang-format off
+// By family, the members in ascending order. HDV and Silverlight share the number of their family.
+inline constexpr ProfileSymbol currentSymbols[] = {
+    {"PSP_H264_640x480",           current(0x0201, 1)},
+    {"PSP_H264_480x270",           current(0x0201, 2)},
+    {"PSP_H264_320x240",           current(0x0201, 3)},
+    {"PSP_MPEG4_320x240",          current(0x0201, 6)},
+    {"IPOD_H264_640x480",          current(0x0202, 1)},
+    {"IPOD_H264_320x240",          current(0x0202, 2)},
+    {"IPOD_MPEG4_640x480",         current(0x0202, 3)},
+    {"IPOD_MPEG4_320x240",         current(0x0202, 4)},
+    {"BD_H264_HDMV",               current(0x0203, 1)},
+    {"BD_H264",                    current(0x0203, 2)},
+    {"BD_MPEG_HDMV",               current(0x0203, 3)},
+    {"BD_MPEG",                    current(0x0203, 4)},
+    {"BD_VC1_HDMV",                current(0x0203, 5)},
+    {"BD_VC1",                     current(0x0203, 6)},
+    {"DVD",                        current(0x0204, 1)},
+    {"SVCD",                       current(0x0204, 2)},
+    {"VCD",                        current(0x0205, 1)},
+    {"DV",                         current(0x0206, 1)},
+    {"DVCPRO25",                   current(0x0206, 2)},
+    {"DVCPRO50",                   current(0x0206, 3)},
+    {"DVCPRO100_720p",             current(0x0206, 4)},
+    {"DVCPRO100_720p_NATIVE",      current(0x0206, 5)},
+    {"DVCPRO100_1080i",            current(0x0206, 6)},
+    {"DVCAM",                      current(0x0207, 1)},
+    {"P2_DVCPRO25",                current(0x0208, 1)},
+    {"P2_DVCPRO50",                current(0x0208, 2)},
+    {"P2_DVCPRO100_720p",          current(0x0208, 3)},
+    {"P2_DVCPRO100_720p_NATIVE",   current(0x0208, 4)},
+    {"P2_DVCPRO100_1080i",         current(0x0208, 5)},
+    {"DVAVI_DV",                   current(0x0209, 1)},
+    {"DVAVI_DVCPRO25",             current(0x0209, 2)},
+    {"DVAVI_DVCPRO50",             current(0x0209, 3)},
+    {"DVAVI_DVCPRO100_720p",       current(0x0209, 4)},
+    {"DVAVI_DVCPRO100_1080i",      current(0x0209, 5)},
+    {"DCI_2K",                     current(0x020A, 1)},
+    {"DCI_4K",                     current(0x020A, 2)},
+    {"DCI_LOSSY",                  current(0x020A, 3)},
+    {"DCI_LOSSLESS",               current(0x020A, 4)},
+    {"DIVX6_QMOBILE",              current(0x020B, 1)},
+    {"DIVX6_MOBILE",               current(0x020B, 2)},
+    {"DIVX6_HOME_THEATER",         current(0x020B, 3)},
+    {"DIVX6_HDTV",                 current(0x020B, 4)},
+    {"DIVX6_1080",                 current(0x020B, 5)},
+    {"DIVX7_HD_PLUS",              current(0x020C, 1)},
+    {"DIVX7_DPS_SD",               current(0x020C, 2)},
+    {"DIVX7_DPS_HD",               current(0x020C, 3)},
+    {"DIVX7_DPS_TRICKPLAY",        current(0x020C, 4)},
+    {"XDCAM_IMX_30",               current(0x020D, 2)},
+    {"XDCAM_IMX_40",               current(0x020D, 3)},
+    {"XDCAM_IMX_50",               current(0x020D, 4)},
+    {"XDCAM_EX_1920",              current(0x020E, 1)},
+    {"XDCAM_EX_1440",              current(0x020E, 2)},
+    {"XDCAM_EX_1280",              current(0x020E, 3)},
+    {"XDCAM_HD_422_1920",          current(0x020F, 1)},
+    {"XDCAM_HD_420_1440_CBR_25",   current(0x020F, 2)},
+    {"XDCAM_HD_420_1440_VBR_17_5", current(0x020F, 3)},
+    {"XDCAM_HD_420_1440_VBR_35",   current(0x020F, 4)},
+    {"XDCAM_HD_420_1280",          current(0x020F, 5)},
+    {"XDCAM_HD_422_1280",          current(0x020F, 6)},
+    {"XDCAM_HD_420_540_12_5",      current(0x020F, 7)},
+    {"XDCAM_HD_420_540_8_75",      current(0x020F, 8)},
+    {"XDCAM_HD_420_540_17_5",      current(0x020F, 9)},
+    {"AVCINTRA_50",                current(0x0210, 1)},
+    {"AVCINTRA_100",               current(0x0210, 2)},
+    {"3GP_H263",                   current(0x0211, 1)},
+    {"3GP_H264",                   current(0x0211, 2)},
+    {"3GP_MPEG4",                  current(0x0211, 3)},
+    {"AVCHD",                      current(0x0212, 1)},
+    {"FLASH_HIGH",                 current(0x0213, 1)},
+    {"FLASH_LOW",                  current(0x0213, 2)},
+    {"DTV_ATSC_SD",                current(0x0214, 1)},
+    {"DTV_ATSC_HD",                current(0x0214, 2)},
+    {"DTV_DVB_SD",                 current(0x0214, 3)},
+    {"DTV_DVB_HD",                 current(0x0214, 4)},
+    {"HDV_HD1",                    current(0x0215, 1)},
+    {"HDV_HD2",                    current(0x0215, 2)},
+    {"SILVERLIGHT_VC1",            current(0x0215, 0x1001)},
+    {"SILVERLIGHT_H264",           current(0x0215, 0x1002)},
+    {"H264_BASELINE",              current(0x0216, 1)},
+    {"H264_MAIN",                  current(0x0216, 2)},
+    {"H264_HIGH",                  current(0x0216, 3)},
+    {"VC1_BASELINE",               current(0x0216, 4)},
+    {"VC1_MAIN",                   current(0x0216, 5)},
+    {"VC1_HIGH",                   current(0x0216, 6)},
+    {"MPEG4_SD",                   current(0x0216, 7)},
+    {"MPEG4_HD",                   current(0x0216, 8)},
+    {"MPEG1",                      current(0x0216, 9)},
+    {"MPEG2_SIMPLE",               current(0x0216, 10)},
+    {"MPEG2_MAIN",                 current(0x0216, 11)},
+    {"MPEG2_HIGH",                 current(0x0216, 12)},
+    {"MPEG2_HIGH_1440",            current(0x0216, 13)},
+    {"MPEG2_422",                  current(0x0216, 14)},
+    {"RAW",                        current(0x0216, 15)},
+    {"AVI_RAW",                    current(0x0216, 16)},
+    {"H264_QT",                    current(0x0216, 17)},
+    {"SVC",                        current(0x0217, 1)},
+    {"GPU",                        current(0x0218, 1)},
+    {"MVC_BD_3D",                  current(0x021A, 1)},
+    {"MVC_STEREO_HIGH",            current(0x021A, 2)},
+    {"VC3_GENERIC",                current(0x021B, 1)},
+};
+static_assert(std::size(currentSymbols) == 100);
+
+inline constexpr ProfileSymbol secondSymbols[] = {
+    {"MPEG_1",                second(1)},
+    {"MPEG_VCD",              second(2)},
+    {"MPEG_2",                second(10)},
+    {"MPEG_DVD_SVCD",         second(12)},
+    {"MPEG_DVB_ATSC",         second(13)},
+    {"MPEG_HDV",              second(15)},
+    {"MPEG_BD_HD_DVD",        second(16)},
+    {"MPEG_D10",              second(17)},
+    {"MPEG_2_HIGH",           second(18)},
+    {"MPEG_2_HIGH_1440",      second(19)},
+    {"MPEG_2_XDCAM_IMX",      second(20)},
+    {"MPEG_2_XDCAM_HD",       second(21)},
+    {"MPEG_2_XDCAM_EX",       second(22)},
+    {"MPEG_2_MAX",            second(29)},
+    {"H264",                  second(30)},
+    {"H264_PSP",              second(31)},
+    {"H264_IPOD",             second(32)},
+    {"H264_AVC_HD",           second(33)},
+    {"H264_BD",               second(34)},
+    {"H264_3GP",              second(36)},
+    {"H264_FLASH_LOW",        second(37)},
+    {"H264_FLASH_HIGH",       second(38)},
+    {"H264_QT",               second(39)},
+    {"VC1",                   second(40)},
+    {"VC1_BD",                second(41)},
+    {"DVCPRO",                second(50)},
+    {"DVCPRO25",              second(51)},
+    {"DVCPRO50",              second(52)},
+    {"DVCPRO100",             second(53)},
+    {"DVCAM",                 second(54)},
+    {"J2K",                   second(60)},
+    {"DCI_2K",                second(61)},
+    {"DCI_4K",                second(62)},
+    {"J2K_END",               second(65)},
+    {"MPEG4",                 second(70)},
+    {"H263_3GP",              second(72)},
+    {"MPEG4_PSP",             second(73)},
+    {"MPEG4_IPOD",            second(74)},
+    {"MPEG4_3GP",             second(76)},
+    {"AVS",                   second(80)},
+    {"DIVX_QMOBILE",          second(90)},
+    {"DIVX_MOBILE",           second(91)},
+    {"DIVX_HOME_THEATER",     second(92)},
+    {"DIVX_HDTV",             second(93)},
+    {"DIVX_1080",             second(94)},
+    {"NONE",                  second(100)},
+    {"RAW",                   second(101)},
+};
+static_assert(std::size(secondSymbols) == 47);
+// clang-format on
+
+// The number of a current symbol that the engine's own tables name; an unknown one does not compile.
+consteval int named(std::string_view symbol) {
+    for (const ProfileSymbol& row : currentSymbols)
+        if (row.name == symbol) return row.number;
+    throw "no such symbol";
+}
+}  // namespace profileScheme
