@@ -25,9 +25,9 @@
 #include "core/arch/api.h"
 #include "core/value/any.h"
 
-// Bytes, counted from 0, of which some can be read at a position. Who makes one derives and gives the four
-// operations at the end, or uses a maker below; who reads calls the public ones, which are safe: whatever the
-// source does, they return, throw nothing, and keep the reason of a failure.
+// Bytes, counted from 0, that are read from a position on. To make a source, use a maker below, or derive and
+// define the protected operations. The public operations are for decoders: whatever the source does, they
+// return, throw nothing, and keep the reason of a failure.
 class QV_API QvByteSource {
   public:
     static constexpr long long unknown = -1;  // size
