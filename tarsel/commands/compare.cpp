@@ -172,9 +172,11 @@ void saveSheet(Pictures& first, Pictures& second, long long offset, const std::v
         const QvFrame& b = right.convert(second.at(number + offset));
         drawDifference(a, b, difference);
         const int top = kGap + i * (height + kGap);
-        sheet.clip(a, 0, 0, kGap, top, width, height);
-        sheet.clip(b, 0, 0, kGap + width + kGap, top, width, height);
-        sheet.clip(difference, 0, 0, kGap + 2 * (width + kGap), top, width, height);
+        int column = kGap;
+        for (const QvFrame* const cell : {&a, &b, static_cast<const QvFrame*>(&difference)}) {
+            if (sheet.clip(*cell, 0, 0, column, top, width, height) != QvStatus::ok) throw std::bad_alloc();
+            column += width + kGap;
+        }
     }
     saved.save(sheet);
 }

@@ -23,9 +23,11 @@ PictureConverter::~PictureConverter() { scaler_->close(); }
 
 const QvFrame& PictureConverter::convert(const QvFrame& from) {
     in_ = from;
+    if (!in_.inited()) throw std::bad_alloc();
     if (scaler_->write(in_) != QvStatus::ok || scaler_->ready() == 0) fail();
     out_ = *scaler_->frame();
     scaler_->next();
+    if (!out_.inited()) throw std::bad_alloc();
     return out_;
 }
 
