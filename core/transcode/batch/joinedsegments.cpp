@@ -145,13 +145,14 @@ int JoinedSegments::startVideo(int segment, int stream) {
 }
 
 // Sound that lasts as long as the picture is there for the last fraction of a frame, too, so it has no end of
-// its own; sound that the job cuts earlier has.
+// its own, and a converter has what it looks ahead for; sound that the job cuts earlier has an end.
 int JoinedSegments::startAudio(int segment, int stream) {
     BatchSegment& of = at(segments, segment);
     SegmentAudio& audio = *at(of.audios, stream);
-    bool bounded = !videoLeads();
-    for (int i = 0; i < sizeOf(of.videos) && !bounded; ++i)
-        bounded = !isSmart(i) && audio.span().duration() < at(of.videos, i)->span().duration();
+    const bool bounded =
+        of.videos.empty() || std::any_of(of.videos.begin(), of.videos.end(), [&](const auto& video) {
+            return audio.span().duration() < video->span().duration();
+        });
     return audio.start(bounded, why);
 }
 
