@@ -298,6 +298,20 @@ TEST_F(Join, ThePlanShowsTheSegments) {
         EXPECT_THAT(plan, HasSubstr(part));
 }
 
+TEST_F(Join, ATaskShowsItsSegmentsBriefly) {
+    Words job{"transcode", "--join", "-o", "x.wav", "--dry-run", "--save-task", "job.xml"};
+    for (int i = 0; i < 23; ++i) job.push_back("s.wav@" + std::to_string(i * 0.01) + "-1");
+    works(job);
+    const std::string text = works({"info", "job.xml"}).out;
+    EXPECT_THAT(text, HasSubstr("  segment 20  audio 0 of '" + folder.file("s.wav") +
+                                "', from 0:00:00.190 to 0:00:01.000\n"));
+    EXPECT_THAT(text, Not(HasSubstr("segment 21")));
+    EXPECT_THAT(text, HasSubstr("  and 3 segments more\n  output "));
+    const Json all = Json::parse(works({"info", "job.xml", "--json"}).out);
+    EXPECT_EQ(all[0]["segments"].size(), 23u);
+    EXPECT_EQ(all[0]["segments"][0]["sources"][0]["to_s"], 1.0);
+}
+
 // A task of more inputs than a process may have open files.
 TEST_F(Join, ThousandsOfSegmentsNeedFewDescriptors) {
     Words job{"-c", "ulimit -n 64; exec \"$@\"", "sh", program(), "transcode", "-o", "o.wav", "--join"};

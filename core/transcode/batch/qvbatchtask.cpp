@@ -6,6 +6,7 @@
 #include <utility>
 
 #include "core/arch/qvassert.h"
+#include "core/arch/qvexception.h"
 #include "core/encode/qvencodepipe.h"
 #include "core/engine/log/qvlog.h"
 #include "core/engine/status.h"
@@ -256,7 +257,13 @@ QvBatchTask* QvBatchTask::fromState(const QvTaskState& state, QvDPipeList& decod
                                     QvEncodePipe** encoderOut, int options, QvFileOpenCb* callback,
                                     Any* error) {
     auto task = std::make_unique<QvBatchTask>();
-    const int result = task->restore(state, decoders, encoderOut, options, callback);
+    int result = QvStatus::ok;
+    try {
+        result = task->restore(state, decoders, encoderOut, options, callback);
+    } catch (const QvException&) {
+        if (error && *task->errorDesc()) *error = Any(task->errorDesc());
+        throw;
+    }
     if (result == QvStatus::ok || result == QvStatus::warning) return task.release();
     if (error) *error = Any(task->errorDesc());
     return nullptr;

@@ -80,7 +80,7 @@ class ForgetEncoder {
 
 TaskFault damaged(const char* text) { return {QvStatus::invalidStructure, text}; }
 
-int linkStoredStream(QvTask& task, const AnyDict& entry, int index, const QvDPipeList& decoders) {
+TaskFault linkStoredStream(QvTask& task, const AnyDict& entry, int index, const QvDPipeList& decoders) {
     QvEncodePipe& pipe = *task.encoder();
     QvOStream* stream = pipe.streamAt(index);
     const int number = pipe.streamNr(stream);
@@ -88,7 +88,7 @@ int linkStoredStream(QvTask& task, const AnyDict& entry, int index, const QvDPip
     const AnyVector sources = entry.getVector("sources");
     if (sources.empty() || !sources.at(0).isDict()) {
         qv_dbg()->warning("QvTask::restore: No source(s) defined for stream %d", index);
-        return QvStatus::ok;
+        return {};
     }
     const AnyDict& source = sources.at(0).asDict();
     QV_ASSERT(source.get("file").isText() && source.get("stream").isPair());
@@ -98,10 +98,18 @@ int linkStoredStream(QvTask& task, const AnyDict& entry, int index, const QvDPip
     while (decoder && task.linkedTo(decoder, address.first, address.second) >= 0)
         decoder = decoders.findByFilename(source.get("file"), decoder);
     QV_ASSERT_MSG(decoder, "no available decoders, decoder must be cloned...");
+    // A decoder would only assert it, without the name of the file.
+    if (address.second < 0 || address.second >= decoder->nrStreams(address.first)) {
+        Any name;
+        return {QvStatus::failed, std::string(printable(source.get("file"), name)) + " has no " +
+                                      QvTask::typeName(address.first) + " stream " +
+                                      std::to_string(address.second)};
+    }
     if (!decoder->isSelected(address.first, address.second)) decoder->select(address.first, address.second);
     ProcessParams params;
     params.update(source.getDict("process"));
-    return task.link(decoder, address.first, address.second, number, params);
+    const int result = task.link(decoder, address.first, address.second, number, params);
+    return {std::min(result, 0), ""};
 }
 
 }  // namespace
@@ -186,7 +194,7 @@ TaskFault restore(QvTask& task, const AnyDict& state, QvDPipeList& decoders, QvE
     ForgetEncoder forget(task);
     for (int i = 0; i < pipe->nrStreams(); ++i) {
         const AnyDict entry = streams.at(i).isDict() ? streams.at(i).asDict() : AnyDict();
-        if (const int result = linkStoredStream(task, entry, i, decoders); result < 0) return {result, ""};
+        if (TaskFault fault = linkStoredStream(task, entry, i, decoders); fault.code < 0) return fault;
     }
     task.setPostprocessCommand(state.get("postProcess"));
     forget.disarm();

@@ -123,7 +123,7 @@ void StoredTask::open() {
         else
             task_.reset(QvTask::fromState(state_, decoders_, &pipe, 0, &report, &error));
     } catch (const QvException&) {
-        error = "an input lacks what it takes from it";
+        if (!error.isValid()) error = "an input lacks what it takes from it";
     }
     pipe_.reset(pipe);
     if (!task_ && memory.ranOut()) throw std::bad_alloc();
