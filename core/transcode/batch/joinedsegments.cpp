@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <limits>
 #include <memory>
+#include <set>
+#include <string>
 
 #include "core/arch/qvassert.h"
 #include "core/decode/qvdecoder.h"
@@ -31,6 +33,35 @@ const QvIStream* BatchSegment::input(int type, int stream) const {
     if (type == qvVideoStream && inRange(stream, videos)) return &at(videos, stream)->input();
     if (type == qvAudioStream && inRange(stream, audios)) return &at(audios, stream)->input();
     return nullptr;
+}
+
+AnyVector JoinedSegments::storedFiles() const {
+    AnyVector files;
+    std::set<std::string> known;
+    const auto add = [&](const QvIStream& input) {
+        const Any name = input.filename().toString();
+        if (!known.insert(name.asString("")).second) return;
+        AnyDict decoder;
+        input.decoder->store(decoder);
+        files.append(AnyDict("filename", input.filename(), "decoder", Any(decoder)));
+    };
+    for (const BatchSegment& segment : segments) {
+        for (const auto& video : segment.videos) add(video->input());
+        for (const auto& audio : segment.audios) add(audio->input());
+    }
+    return files;
+}
+
+AnyVector JoinedSegments::storedSources(const Pair& address) const {
+    AnyVector sources;
+    for (const BatchSegment& segment : segments) {
+        const QvIStream* input = segment.input(address.first, address.second);
+        if (!input) return AnyVector();
+        AnyDict source("file", input->filename(), "stream", Any(Pair(input->type, input->number)));
+        source.set("process", static_cast<const AnyDict&>(input->params));
+        sources.append(Any(source));
+    }
+    return sources;
 }
 
 // A conversion would be passed by.

@@ -21,12 +21,33 @@ const char* printable(const Any& text, Any& holder) {
     return holder.isString() ? holder.asString() : "";
 }
 
-AnyDict storedSource(const TransLink& link) {
+// A decoder that joins others can't be opened from a file: their own entries stand in its place.
+void appendFiles(const QvDecodePipe& decoder, AnyVector& files) {
+    if (const Any joined = decoder.QvCodec::getParam("segmentFiles"); joined.isVector()) {
+        files.extend(joined.asVector());
+        return;
+    }
+    AnyDict file, own;
+    file.set("filename", decoder.QvCodec::getParam("filename"));
+    decoder.store(own);
+    file.set("decoder", own);
+    files.append(file);
+}
+
+// One for each segment of what is linked.
+AnyVector storedSources(const TransLink& link) {
+    if (link.decoder()->QvCodec::getParam("segmentSources").isVector()) {
+        Any joined = Pair(link.type(), link.decStreamNr());
+        link.decoder()->getParam("segmentSources", joined);
+        return joined.asVector();
+    }
     AnyDict source;
     source.set("file", link.decoder()->QvCodec::getParam("filename"));
     source.set("stream", Any(Pair(link.type(), link.decStreamNr())));
     source.set("process", static_cast<const AnyDict&>(link.processParams()));
-    return source;
+    AnyVector sources;
+    sources.append(source);
+    return sources;
 }
 
 // The processing parameters of source 0 of the number-th stored stream of a type.
@@ -133,13 +154,7 @@ void store(const QvTask& task, AnyDict& dict) {
     dict.set("__class__", "TranscodeTask");
     const QvDPipeList& decoders = task.decoders();
     AnyVector files;
-    for (int i = 0; i < decoders.size(); ++i) {
-        AnyDict file, decoder;
-        file.set("filename", decoders.at(i)->QvCodec::getParam("filename"));
-        decoders.at(i)->store(decoder);
-        file.set("decoder", decoder);
-        files.append(file);
-    }
+    for (const QvDecodePipe* const decoder : decoders) appendFiles(*decoder, files);
     dict.set("files", files);
     if (task.postprocessCommand().isValid()) dict.set("postProcess", task.postprocessCommand());
     QvEncodePipe* pipe = task.encoder();
@@ -156,9 +171,7 @@ void store(const QvTask& task, AnyDict& dict) {
         entry.set("type", stream->type);
         if (const TransLink* link = task.getLinkForOutput(stream->type, number)) {
             QV_ASSERT(link->encStreamNr() == number);
-            AnyVector sources;
-            sources.append(storedSource(*link));
-            entry.set("sources", sources);
+            entry.set("sources", storedSources(*link));
         }
         streams.append(entry);
     }

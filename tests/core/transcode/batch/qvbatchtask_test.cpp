@@ -116,6 +116,31 @@ TEST_F(Joined, CutsOfOneFileMeetToTheFrameAndSample) {
     EXPECT_TRUE(samples(written(".wav").substr(80)) == heard);
 }
 
+// What is stored is the inputs of the segments, and it is the same after it was restored.
+TEST_F(Joined, AJoinedTaskIsStoredWithItsSegments) {
+    const AnyDict slow = film("a.yuv", 100, 1, f25, 16, 8),
+                  fast = film("b.yuv", 100, 101, QvFramerate(50.0), 16, 8);
+    const AnyDict first = sound("a.wav", 200000, 5, 44100), second = sound("b.wav", 100000, 9, 48000);
+    addBoth(slow, first, cut(0.4, 0.8));
+    addBoth(fast, second, cut(0.2, 0.6));
+    addBoth(slow, first, cut(2, 2.2));
+    const auto made = restore();
+    ASSERT_TRUE(made->task) << made->error;
+    AnyDict stored, again;
+    made->task->store(stored);
+    EXPECT_EQ(run(*made->task), 0);
+    const std::string picture = written(".raw"), heard = written(".wav");
+    EXPECT_EQ(stored.getVector("files").size(), 4);
+    state_ = QvTaskState(stored);
+    EXPECT_EQ(state_.nrSegments(), 3);
+    const auto open = restore();
+    ASSERT_TRUE(open->task) << open->error;
+    open->task->store(again);
+    EXPECT_EQ(again, stored);
+    EXPECT_EQ(run(*open->task), 0);
+    EXPECT_TRUE(written(".raw") == picture && written(".wav") == heard);
+}
+
 // Those outside of a cut go, the others are at the frames of the output.
 TEST_F(Joined, ChaptersAndQualityLogsAreThoseOfTheWhole) {
     const AnyDict slow = film("a.yuv", 100, 1, f25, 16, 8),
