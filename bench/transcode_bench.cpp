@@ -1,8 +1,11 @@
 // Whole jobs of the engine against the plainest program that moves the same bytes.
+#include <algorithm>
+#include <chrono>
 #include <cstring>
 #include <fstream>
 #include <memory>
 #include <string>
+#include <thread>
 #include <vector>
 
 #include <fcntl.h>
@@ -37,8 +40,8 @@ std::unique_ptr<QvDecodePipe> rawSource(const std::string& name, unsigned fourcc
     return decoder;
 }
 
-std::unique_ptr<QvDecodePipe> generator(int seconds) {
-    AnyDict video, streams;
+std::unique_ptr<QvDecodePipe> generator(int seconds, bool sound = false) {
+    AnyDict video, audio, streams;
     video.set("width", kWidth);
     video.set("height", kHeight);
     video.set("framerate", 25.0);
@@ -46,11 +49,16 @@ std::unique_ptr<QvDecodePipe> generator(int seconds) {
     AnyVector vids;
     vids.append(video);
     streams.set("vids", vids);
+    AnyVector auds;
+    audio.set("duration", static_cast<double>(seconds));
+    auds.append(audio);
+    if (sound) streams.set("auds", auds);
     std::unique_ptr<QvDecodePipe> decoder(
         static_cast<QvDecodePipe*>(qv_registry()->newCodec("testgen")->getInterface(2)));
     decoder->setParam("streams", streams);
     decoder->open();
     decoder->select(1, 0);
+    if (sound) decoder->select(2, 0);
     return decoder;
 }
 
@@ -94,6 +102,26 @@ void bareCalls(QvDecodePipe& decoder) {
     pipe->open();
     while (decoder.readFrame(0) == 0) pipe->writeFrame(decoder.getFramePtr(0), 0);
     pipe->close();
+}
+
+// Stops a job of picture and sound on a worker at many moments. The longest time until it has ended, in ms.
+double longestStop(QvDecodePipe& decoder, int stops) {
+    const auto pipe = outputFor(decoder, "nullmux");
+    QvTranscoder transcoder;
+    transcoder.setEncoder(pipe.get());
+    transcoder.setDecoder(&decoder);
+    transcoder.setParam("startDelay", 0);
+    transcoder.linkAll();
+    double longest = 0;
+    for (int i = 0; i < stops; ++i) {
+        transcoder.transcode(false);
+        if (i % 3 == 0) transcoder.pause();
+        std::this_thread::sleep_for(std::chrono::microseconds(i * 7919 % 20000));
+        const double begun = qvBenchSeconds(QvBenchClock::wall);
+        transcoder.stop();
+        longest = std::max(longest, (qvBenchSeconds(QvBenchClock::wall) - begun) * 1000);
+    }
+    return longest;
 }
 
 // What the plainest copier does: blocks of 1 MiB.
@@ -181,6 +209,13 @@ int main() {
         "WAV to WAV : 1 MiB read and write", 1.5,
         [&] { transcode(*sound, "rawmux", folder.file("out.wav")); },
         [&] { copyFile(wav, folder.file("copy.wav")); });
+
+    auto film = generator(kSeconds, true);
+    const double begun = qvBenchSeconds(QvBenchClock::wall);
+    transcode(*film, "nullmux", "");
+    QvRatioBench::tell("a frame of 1920x1080 with its sound",
+                       (qvBenchSeconds(QvBenchClock::wall) - begun) * 1000 / kFrames, "ms");
+    QvRatioBench::tell("longest of 300 stops of such a job", longestStop(*film, 300), "ms");
 
     // The peak must not move with the length of the input: the second job is four times the first.
     const double before = peakMiB();

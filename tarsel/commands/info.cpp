@@ -5,6 +5,7 @@
 #include "tarsel/host/console.h"
 #include "tarsel/host/files.h"
 #include "tarsel/job/task/storedtask.h"
+#include "tarsel/job/task/tasktext.h"
 #include "tarsel/source/source.h"
 #include "tarsel/words/commandline.h"
 #include "tarsel/words/json.h"
@@ -224,10 +225,13 @@ bool isTaskFile(const std::string& name) {
     });
 }
 
-Json describeTask(const std::string& name) {
+Json showTask(const std::string& name, bool json) {
     requireInput(name);
-    requireTask(name);
-    return {{"file", name}, {"task", "sound"}, {"bytes", fileBytes(name)}};
+    const StoredTask task(name);
+    if (!json) print("%s\n  a sound task\n%s", inQuotes(name).c_str(), taskBrief(task).c_str());
+    Json object = {{"file", name}, {"task", "sound"}, {"bytes", fileBytes(name)}};
+    object.update(taskBriefJson(task));
+    return object;
 }
 
 struct Given {
@@ -243,8 +247,7 @@ void info(const Given& given) {
     for (const auto& name : given.files) {
         try {
             if (isTaskFile(name)) {
-                all.push_back(describeTask(name));
-                if (!given.json) print("%s\n  a sound task\n", inQuotes(name).c_str());
+                all.push_back(showTask(name, given.json));
                 continue;
             }
             const Source source(name, given.raw);

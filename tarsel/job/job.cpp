@@ -1,9 +1,12 @@
 #include "tarsel/job/job.h"
 
 #include <algorithm>
+#include <atomic>
+#include <new>
 
 #include "tarsel/host/console.h"
 #include "tarsel/host/events.h"
+#include "tarsel/host/memory.h"
 #include "tarsel/job/jobrun.h"
 #include "tarsel/job/keptchunks.h"
 #include "tarsel/job/outputpipe.h"
@@ -88,6 +91,9 @@ void Job::joinInputs() {
     parts_.pipe = parts_.stored->takePipe();
     JobPlan plan = planTask(*parts_.stored, planner.whole().output, readInputs(), options_.acceptPartial);
     plan.warnings = planner.whole().warnings;
+    level_ = planner.level();
+    if (level_ && options_.dryRun && options_.saveTask.empty())
+        plan.notes.push_back(lineOf(Msg::joinLevelLater));
     plan.filterFiles.read = planner.files();
     begin(std::move(plan));
 }
@@ -136,6 +142,36 @@ std::vector<std::string> Job::filesRead() const {
     return files;
 }
 
+std::pair<std::vector<double>, double> Job::measureGains() {
+    std::atomic<bool> stop{false};
+    std::atomic<double> part{0};
+    const auto now = [&] { return ProgressState{.part = part / 2, .pass = 1, .passes = 2}; };
+    Progress progress(options_.progress, options_.quiet || options_.dryRun, "task 1 of 1  ", false);
+    const Signals::Watch measuring(signals_, {.first = [&](int) { stop = true; },
+                                              .second = [this] { return parts_.outputs.leave(); },
+                                              .report = [&] { progress.report(now()); },
+                                              .suspend = [&] { progress.time().stopping(); },
+                                              .resume = [&] { progress.time().continued(); }});
+    const MemoryWatch memory;
+    progress.start(now());
+    std::optional<std::vector<double>> gains;
+    try {
+        gains = level_->gains([&](double measured) {
+            part = measured;
+            if (progress.due()) progress.update(now());
+            return !stop && signals_.received() == Exit::done;
+        });
+    } catch (const std::exception&) {
+        if (memory.ranOut()) throw std::bad_alloc();
+        throw;
+    }
+    ProgressState end = now();
+    if (!gains) end.state = "stopped";
+    progress.finish(end);
+    if (!gains) throw Failure(signals_.received(), lineOf(Msg::stoppedWithNothing));
+    return {*gains, progress.time().seconds()};
+}
+
 void Job::checkWarnings() const {
     if (options_.strict) warnings_.refuse(options_.quiet, parts_.plan.output.name);
 }
@@ -157,8 +193,17 @@ void runJob(JobOptions& options, const std::function<std::unique_ptr<Job>()>& ma
     // Of an input that becomes shorter each time that it is read.
     constexpr int mostAttempts = 3;
     for (int attempt = 1;; ++attempt) {
-        const std::unique_ptr<Job> job = make();
+        options.sound.gains.clear();
+        std::unique_ptr<Job> job = make();
         job->checkWarnings();
+        if (job->needsGains() && (!options.dryRun || !options.saveTask.empty())) {
+            const auto [gains, seconds] = job->measureGains();
+            options.sound.gains = gains;
+            options.measuredFor = seconds;
+            job.reset();  // which has the names of the outputs
+            job = make();
+            job->checkWarnings();
+        }
         if (options.dryRun) return job->printPlan();
         try {
             return job->run();

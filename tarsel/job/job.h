@@ -3,11 +3,14 @@
 
 #include <functional>
 #include <memory>
+#include <utility>
+#include <vector>
 
 #include "tarsel/host/signals.h"
 #include "tarsel/job/inputlengths.h"
 #include "tarsel/job/joboptions.h"
 #include "tarsel/job/jobparts.h"
+#include "tarsel/job/task/joinlevel.h"
 #include "tarsel/job/warnings.h"
 
 class Job {
@@ -19,6 +22,11 @@ class Job {
 
     // With --strict: throws Failure if there is a warning.
     void checkWarnings() const;
+    // Whether sounds have to be measured before the job is made once more, with the gains in its options.
+    bool needsGains() const { return level_ != nullptr; }
+    // The gains, and how many seconds they took. Shows progress as a first pass. Throws Failure, also when it
+    // was stopped.
+    std::pair<std::vector<double>, double> measureGains();
     // Writes the task file if there is to be one, and prints the plan to the standard output.
     void printPlan();
     // Carries the plan out; see JobRun::run. Throws InputShrank for a job that can be run again.
@@ -42,6 +50,7 @@ class Job {
     bool rawTaken_ = false;  // --raw describes an input
     bool joined_ = false;    // the last source
     Warnings warnings_;
+    std::unique_ptr<JoinLevel> level_;
 };
 
 // Makes the job, and prints or runs it; once more where an input has become shorter meanwhile and the options

@@ -17,4 +17,5 @@ struct JobOptions : PlanOptions {
     bool relative = false;              // the task file has names that count from its folder
     bool strict = false;                // warnings are failures
     std::vector<std::string> warnings;  // of earlier attempts
+    double measuredFor = -1;            // seconds that a pass over the sound took before; negative for none
 };

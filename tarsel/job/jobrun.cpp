@@ -86,6 +86,7 @@ std::vector<ProcessParams> JobRun::beginFilters() {
 void JobRun::transcode(const std::vector<ProcessParams>& params) {
     const MemoryWatch memory;
     JobTranscoder transcoder(parts_, progress_);
+    if (options_.measuredFor >= 0) transcoder.countMeasuring();
     const Signals::Watch running(signals_, {.first = [&](int) { transcoder.requestStop(); },
                                             .second = [this] { return parts_.outputs.leave(); },
                                             .report = [&] { transcoder.report(); },
@@ -128,7 +129,8 @@ void JobRun::addClipped(const std::vector<long long>& clipped) {
 int JobRun::start(JobTranscoder& transcoder) {
     if (const std::string name = parts_.outputs.begin(); !name.empty())
         parts_.pipe->setFilename(Any(name.c_str()));
-    progress_.start();
+    options_.measuredFor < 0 ? progress_.start()
+                             : progress_.start({.part = 0.5, .pass = 2, .passes = 2}, options_.measuredFor);
     qv_log()->clear();
     stopIfSignalled();
     const int result = transcoder.transcode(false);

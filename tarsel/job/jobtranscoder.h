@@ -20,6 +20,8 @@ class JobTranscoder : public QvTranscoder {
     JobTranscoder(JobParts& parts, Progress& progress);
     ~JobTranscoder() override { QvTranscoder::stop(); }
 
+    // The sound was measured before: the run is the second pass.
+    void countMeasuring() { measured_ = 1; }
     // Joins the streams of the plan; `params` are those of each. Throws Failure.
     void join(const std::vector<ProcessParams>& params);
     // The result of the run. `slow` is called when a requested stop takes a while.

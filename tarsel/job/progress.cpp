@@ -60,9 +60,10 @@ ProgressMode parseProgress(const std::string& text) {
 
 // --- The time of a job.
 
-void RunningTime::start() {
+void RunningTime::start(double before) {
     const std::lock_guard guard(lock_);
-    begin_ = tick_ = QvTimer::absoluteTime();
+    tick_ = QvTimer::absoluteTime();
+    begin_ = tick_ - before;
     away_ = 0;
     paused_ = stopped_ = longStepEnd_ = -1;
 }
@@ -133,10 +134,10 @@ Progress::~Progress() {
     if (shown_ && line_) std::fputs("\r\x1b[K", stderr);
 }
 
-void Progress::start() {
-    time_.start();
+void Progress::start(const ProgressState& first, double before) {
+    time_.start(before);
     last_ = time_.tick();
-    show(ProgressState{0, 0, 0, 1, 1, "running"});
+    show(first);
 }
 
 bool Progress::due() {

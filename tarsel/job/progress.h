@@ -30,7 +30,8 @@ ProgressMode parseProgress(const std::string& text);
 // thread.
 class RunningTime {
   public:
-    void start();
+    // `before`: seconds for which it has been running already.
+    void start(double before = 0);
     // That the job is at work; returns the seconds of the system's counter.
     double tick();
     void pause();
@@ -58,7 +59,9 @@ class Progress {
     Progress(const ProgressMode& mode, bool quiet, std::string label, bool keys = true);
     ~Progress();
 
-    void start();
+    void start() { start({0, 0, 0, 1, 1, "running"}); }
+    // Where another pass has taken `before` seconds already.
+    void start(const ProgressState& first, double before = 0);
     // Cheap: shows something only when the last time is long enough ago.
     void update(const ProgressState& state);
     bool due();

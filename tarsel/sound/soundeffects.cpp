@@ -93,6 +93,14 @@ AnyDict volumeState(double decibels) {
     return stateOf(*filter);
 }
 
+// Fractions of a gain have 16 bits, of which a large step down would leave few; a large step up is refused.
+std::vector<AnyDict> gainStates(double decibels) {
+    constexpr double mostAtOnce = 24;  // dB, to within 0.002 dB
+    const double steps = std::ceil(std::abs(decibels) / mostAtOnce);
+    if (steps < 1) return {};
+    return std::vector<AnyDict>(static_cast<size_t>(steps), volumeState(decibels / steps));
+}
+
 AnyDict delayState(const MediaTime& delay) {
     const auto filter = filterNamed("adelay");
     setChecked(*filter, "delay", static_cast<int>(std::lround(delay.seconds() * 1000)), "--delay");

@@ -36,7 +36,11 @@ SoundTarget parseTarget(const std::string& text);
 // "TIME" or "-TIME", an hour at most. Throws Failure (usage).
 MediaTime parseDelay(const std::string& text, const std::optional<QvFramerate>& rate);
 
+// A sound of more channels would lose the others.
+constexpr int kMostVolumeChannels = 8;
 AnyDict volumeState(double decibels);
+// Any gain, precisely: one state or several in a row.
+std::vector<AnyDict> gainStates(double decibels);
 AnyDict delayState(const MediaTime& delay);  // to the millisecond
 AnyDict normalizerState(const SoundTarget& target);
 

@@ -10,6 +10,7 @@ class Command;
 struct SoundOptions {
     std::vector<std::string> volumes;
     std::string delay, normalize, map, dither;
+    std::vector<double> gains;  // dB of each sound, which were measured for `normalize`
 
     // The first given option that needs a sound.
     std::string given() const;

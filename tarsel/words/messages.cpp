@@ -32,6 +32,7 @@ constexpr Message kMessages[] = {
     {Msg::rangeWrong,        Exit::usage, "{option}",                               "{name} is no part of a time",                           "give FROM-TO, as 10-20, 1:30-2:00, 250f-500f or 10-"},
     {Msg::segmentNoStreams,  Exit::input, "can't join {file}",                      "it has neither picture nor sound that the output takes", "leave it out"},
     {Msg::joinRefuses,       Exit::usage, "{option}",                               "it has no meaning for several segments",                "join first, and give it to a second run"},
+    {Msg::joinLevelLater,    Exit::done,  "--normalize",                            "the gain is measured when the job runs",                ""},
     {Msg::timeBeforeStart,  Exit::usage, "{option}", "{name} is before the start, as all of it is {text}",    "give a time nearer to the end"},
     {Msg::rateWrong,        Exit::usage, "{option}", "{name} is not a frame rate",                            "use 25, 29.97, 30000/1001, pal, ntsc or film, or 25i and 25b for fields"},
     {Msg::rateOfFields,     Exit::usage, "{option}", "{name} counts fields; 'i' and 'b' follow frames a second", "use {text}"},

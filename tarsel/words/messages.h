@@ -32,6 +32,7 @@ enum class Msg : unsigned short {
     rangeWrong,
     segmentNoStreams,
     joinRefuses,
+    joinLevelLater,
     timeBeforeStart,
     rateWrong,
     rateOfFields,

@@ -172,7 +172,10 @@ TEST_F(Command, ATaskFileHoldsTheJob) {
     for (const char* part : {"<TranscodeTask", "in.wav", "out.wav", "rawaenc", "rawmux", "ls %o"})
         EXPECT_THAT(task, HasSubstr(part));
     EXPECT_THAT(task, testing::Not(HasSubstr(".tarsel-")));
-    EXPECT_EQ(works({"info", "job.xml"}).out, "'job.xml'\n  a sound task\n");
+    EXPECT_EQ(works({"info", "job.xml"}).out, "'job.xml'\n  a sound task\n  segment 1  audio 0 of '" +
+                                                  folder.file("in.wav") +
+                                                  "', from 0:00:00.250 to 0:00:01.000\n  output     '" +
+                                                  folder.file("out.wav") + "' by rawmux\n");
     folder.write("bad.xml",
                  task.substr(0, task.find("<i32>")) + "<i32>x" + task.substr(task.find("<i32>") + 6));
     fails(3, {"info", "bad.xml"}, {"'bad.xml' is no sound task: line 7, encoder/", "it is no whole number"});

@@ -2,9 +2,13 @@
 #include <cstdlib>
 #include <random>
 
+#include <nlohmann/json.hpp>
+
 #include "tests/system/tool.h"
 
 namespace {
+
+using Json = nlohmann::json;
 
 using testing::HasSubstr;
 using testing::Not;
@@ -178,6 +182,86 @@ TEST_F(Join, CutsKeepTheTimesOfTheirInput) {
     }
 }
 
+// A gain of its own for each segment would lose how loud they are next to each other.
+TEST_F(Join, OneGainBringsAllSegmentsToALevel) {
+    const auto tone = [&](const char* name, const Words& options) {
+        works(Words{"transcode", "testgen:size=32x32,rate=25,duration=3", "--no-video", "-o", name} +
+              options);
+    };
+    const auto measured = [&](const std::string& name) {
+        return Json::parse(works({"loudness", name, "--json"}).out)[0]["streams"][0];
+    };
+    tone("loud.wav", {"--volume=-20"});
+    tone("quiet.wav", {"--volume=-38", "--samplerate", "48000", "--channels", "1", "--bits", "24"});
+    const Words join{"transcode",    "--join",   "loud.wav", "quiet.wav@0-1.5",
+                     "loud.wav@1-2", "--dither", "none"};
+    works(join + Words{"-o", "joined.wav"});
+    const struct {
+        const char *option, *key;
+        double level;
+    } rows[] = {{"--normalize", "integrated_lufs", -23},
+                {"--normalize=-50", "integrated_lufs", -50},
+                {"--normalize=peak:-6", "sample_peak_dbfs", -6},
+                {"--normalize=rms:-20", "rms_dbfs", -20}};
+    for (const auto& row : rows) {
+        works(join + Words{row.option, "-o", "n.wav", "-y", "--save-task", "job.xml"});
+        EXPECT_NEAR(measured("n.wav")[row.key].get<double>(), row.level, 0.1) << row.option;
+        const std::string made = contents("n.wav");
+        EXPECT_THAT(contents("job.xml"), Not(HasSubstr("normalizer"))) << "the task has the gain";
+        works({"run", "job.xml", "-y"});
+        EXPECT_TRUE(contents("n.wav") == made) << row.option;
+        works({"transcode", "joined.wav", row.option, "--dither", "none", "-o", "once.wav", "-y"});
+        const std::string once = wavPart(contents("once.wav"), "data"), parts = wavPart(made, "data");
+        ASSERT_EQ(once.size(), parts.size());
+        for (std::size_t at = 0; at < once.size(); at += 2) {
+            const auto value = [&](const std::string& s) {
+                return static_cast<std::int16_t>(leNumber(s, at, 2));
+            };
+            ASSERT_NEAR(value(once), value(parts), 40) << row.option << at;
+        }
+    }
+    const Outcome bound = works(join + Words{"--normalize=0", "-o", "n.wav", "-y", "--progress", "json"});
+    EXPECT_THAT(bound.err, HasSubstr("true peak is at the limit"));
+    EXPECT_THAT(bound.err, HasSubstr("\"pass\":1,\"passes\":2"));
+    EXPECT_THAT(bound.err, HasSubstr("\"pass\":2,\"passes\":2"));
+    // The plan needs no measuring, but a task does.
+    const Outcome plan = works(join + Words{"--normalize", "-o", "x.wav", "--dry-run"});
+    EXPECT_THAT(plan.err, HasSubstr("is measured when the job runs"));
+    works(join + Words{"--normalize", "-o", "x.wav", "--dry-run", "--save-task", "dry.xml"});
+    EXPECT_THAT(contents("dry.xml"), HasSubstr("avol"));
+    EXPECT_EQ(size("x.wav"), -1);
+}
+
+// The sound next to the pictures counts as far as they go, and nothing else of its file.
+TEST_F(Join, TheLevelIsOfWhatIsHeard) {
+    std::string sound;
+    for (int i = 0; i < 3 * 44100; ++i)
+        sound += leBytes(static_cast<std::uint64_t>(i < 44100 ? i % 100 * 20 : i % 100 * 300), 2);
+    folder.write("t.wav", riff(wavChunk("fmt ", wavFormat(1, 1, 44100, 16)) + wavChunk("data", sound)));
+    works(Words{"transcode", "--join", "p.yuv+t.wav@0f-10f", "p.yuv@0f-5f", "p.yuv+t.wav@10f-20f", "--pixel",
+                "I420", "--normalize=peak:-6", "--dither", "none", "-o", "o.yuv"} +
+          kRaw);
+    EXPECT_NEAR(Json::parse(works({"loudness", "o.wav", "--json"}).out)[0]["streams"][0]["sample_peak_dbfs"]
+                    .get<double>(),
+                -6, 0.1);
+}
+
+TEST_F(Join, AStopEndsTheMeasuring) {
+    std::string out;
+    const std::string tone = "testgen:size=32x32,rate=25,duration=40000";
+    Process run(words({"transcode", "--join", tone, tone, "--no-video", "--normalize", "-o", "o.wav",
+                       "--progress", "json"}),
+                here());
+    const auto before = listing();
+    // The first one comes before anything is read.
+    for (int i = 0; i < 3; ++i) ASSERT_TRUE(run.waitFor("\"pass\":1,\"passes\":2"));
+    run.signal(SIGTERM);
+    const Outcome o = run.finish();
+    EXPECT_EQ(o.status, 143) << o.err;
+    EXPECT_THAT(o.err, HasSubstr("\"state\":\"stopped\""));
+    EXPECT_EQ(listing(), before);
+}
+
 TEST_F(Join, NamesAreReadAsTheyExist) {
     const std::string wav = contents("s.wav");
     for (const char* name : {"a@1-2", "a+b.wav", "c.wav@3-4"}) folder.write(name, wav);
@@ -190,6 +274,8 @@ TEST_F(Join, NamesAreReadAsTheyExist) {
 TEST_F(Join, WhatCantBeJoinedIsRefusedByName) {
     const Words join{"transcode", "--join", "p.yuv@0f-10f", "p.yuv@20f-30f", "-o", "x.yuv"};
     fails(2, join + kRaw + Words{"--filter", "rawdump:filename=d"}, {"--filter rawdump", "each segment"});
+    fails(2, join + kRaw + Words{"--delay", "1"}, {"--delay", "several segments"});
+    fails(2, join + kRaw + Words{"--normalize"}, {"--normalize", "no sound"});
     fails(2, join + kRaw + Words{"--from", "1"}, {"--from", "--join"});
     fails(2, join + kRaw + Words{"--cut", "1-2"}, {"--join", "--cut"});
     fails(2, join + kRaw + Words{"--volume", "3"}, {"--volume"});
@@ -210,6 +296,20 @@ TEST_F(Join, ThePlanShowsTheSegments) {
     for (const char* part : {"segment  1\n", "video 0 of 'p.yuv', from 0:00:00.000", "segment  2\n",
                              "'s.wav'", "expect  40 frames"})
         EXPECT_THAT(plan, HasSubstr(part));
+}
+
+TEST_F(Join, ATaskShowsItsSegmentsBriefly) {
+    Words job{"transcode", "--join", "-o", "x.wav", "--dry-run", "--save-task", "job.xml"};
+    for (int i = 0; i < 23; ++i) job.push_back("s.wav@" + std::to_string(i * 0.01) + "-1");
+    works(job);
+    const std::string text = works({"info", "job.xml"}).out;
+    EXPECT_THAT(text, HasSubstr("  segment 20  audio 0 of '" + folder.file("s.wav") +
+                                "', from 0:00:00.190 to 0:00:01.000\n"));
+    EXPECT_THAT(text, Not(HasSubstr("segment 21")));
+    EXPECT_THAT(text, HasSubstr("  and 3 segments more\n  output "));
+    const Json all = Json::parse(works({"info", "job.xml", "--json"}).out);
+    EXPECT_EQ(all[0]["segments"].size(), 23u);
+    EXPECT_EQ(all[0]["segments"][0]["sources"][0]["to_s"], 1.0);
 }
 
 // A task of more inputs than a process may have open files.

@@ -121,6 +121,16 @@ TEST_F(Task, ACommandRunsOnlyWhenItIsAllowed) {
               (folder.path() / "out.wav").string() + " " + (folder.path() / "in.wav").string() + "\n");
 }
 
+// The input was replaced by one that has less.
+TEST_F(Task, AnInputThatLacksAStreamIsNamed) {
+    works(Words{"transcode"} + kCard + Words{"-o", "card.avi", "--save-task", "job.xml", "--dry-run"});
+    std::string task = contents("job.xml");
+    const std::string address = "first=\"2\" second=\"0\"";
+    task.replace(task.find(address), address.size(), "first=\"2\" second=\"4\"");
+    folder.write("job.xml", task);
+    fails(3, {"run", "job.xml"}, {"'job.xml' is no sound task", "has no audio stream 4"});
+}
+
 TEST_F(Task, DamagedTasksAreRefusedByName) {
     works({"transcode", "in.wav", "-o", "out.wav", "--save-task", "job.xml"});
     std::string task = contents("job.xml");

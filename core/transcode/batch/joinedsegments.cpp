@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <limits>
 #include <memory>
+#include <set>
+#include <string>
 
 #include "core/arch/qvassert.h"
 #include "core/decode/qvdecoder.h"
@@ -31,6 +33,35 @@ const QvIStream* BatchSegment::input(int type, int stream) const {
     if (type == qvVideoStream && inRange(stream, videos)) return &at(videos, stream)->input();
     if (type == qvAudioStream && inRange(stream, audios)) return &at(audios, stream)->input();
     return nullptr;
+}
+
+AnyVector JoinedSegments::storedFiles() const {
+    AnyVector files;
+    std::set<std::string> known;
+    const auto add = [&](const QvIStream& input) {
+        const Any name = input.filename().toString();
+        if (!known.insert(name.asString("")).second) return;
+        AnyDict decoder;
+        input.decoder->store(decoder);
+        files.append(AnyDict("filename", input.filename(), "decoder", Any(decoder)));
+    };
+    for (const BatchSegment& segment : segments) {
+        for (const auto& video : segment.videos) add(video->input());
+        for (const auto& audio : segment.audios) add(audio->input());
+    }
+    return files;
+}
+
+AnyVector JoinedSegments::storedSources(const Pair& address) const {
+    AnyVector sources;
+    for (const BatchSegment& segment : segments) {
+        const QvIStream* input = segment.input(address.first, address.second);
+        if (!input) return AnyVector();
+        AnyDict source("file", input->filename(), "stream", Any(Pair(input->type, input->number)));
+        source.set("process", static_cast<const AnyDict&>(input->params));
+        sources.append(Any(source));
+    }
+    return sources;
 }
 
 // A conversion would be passed by.
@@ -145,13 +176,14 @@ int JoinedSegments::startVideo(int segment, int stream) {
 }
 
 // Sound that lasts as long as the picture is there for the last fraction of a frame, too, so it has no end of
-// its own; sound that the job cuts earlier has.
+// its own, and a converter has what it looks ahead for; sound that the job cuts earlier has an end.
 int JoinedSegments::startAudio(int segment, int stream) {
     BatchSegment& of = at(segments, segment);
     SegmentAudio& audio = *at(of.audios, stream);
-    bool bounded = !videoLeads();
-    for (int i = 0; i < sizeOf(of.videos) && !bounded; ++i)
-        bounded = !isSmart(i) && audio.span().duration() < at(of.videos, i)->span().duration();
+    const bool bounded =
+        of.videos.empty() || std::any_of(of.videos.begin(), of.videos.end(), [&](const auto& video) {
+            return audio.span().duration() < video->span().duration();
+        });
     return audio.start(bounded, why);
 }
 

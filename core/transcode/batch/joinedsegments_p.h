@@ -53,6 +53,8 @@ class JoinedSegments {
     bool isSmart(int video) const { return smartStreams.contains(Any(video)); }
     // What an encoder needs to take over coded frames of (type, stream); false unless every segment can give
     // it unconverted.
+    AnyVector storedFiles() const;
+    AnyVector storedSources(const Pair& address) const;
     bool smartParams(const Pair& address, AnyDict& out) const;
     int frameTotal(int stream) const;         // at any time
     long long sampleTotal(int stream) const;  // of the sources' sound

@@ -158,6 +158,10 @@ void QvBatchDecoder::getParam(const char* name, Any& value) const {
             for (const auto& audio : segment.audios)
                 if (audio->endedEarly()) names.append(audio->input().filename());
         value = names;
+    } else if (std::strcmp(name, "segmentFiles") == 0) {
+        value = p_->storedFiles();
+    } else if (std::strcmp(name, "segmentSources") == 0) {
+        value = value.isPair() ? p_->storedSources(value.asPair()) : AnyVector();
     } else if (std::strcmp(name, "srParams") == 0) {
         AnyDict params;
         if (value.isPair() && p_->smartParams(value.asPair(), params))

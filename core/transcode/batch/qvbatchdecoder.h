@@ -14,6 +14,10 @@
 // The parameter "endedEarly" is a Vector of the names of inputs whose sound ended before they said it does;
 // what they lack was filled with silence.
 //
+// A task that is stored has the inputs in the place of this decoder: "segmentFiles" is the Vector of the
+// entries of a state's "files", each once. "segmentSources", asked with a Pair of type and stream in the
+// value, is the "sources" of that stream, and an empty Vector when asked with anything else.
+//
 // The decoders belong to the caller and outlive this one. They hold no file and no codec before their segment
 // is near, if they can do without (see QvDecodePipe). One thread at a time.
 #pragma once

@@ -6,6 +6,7 @@
 #include <utility>
 
 #include "core/arch/qvassert.h"
+#include "core/arch/qvexception.h"
 #include "core/arch/undo_p.h"
 #include "core/encode/qvencodepipe.h"
 #include "core/engine/log/qvlog.h"
@@ -13,6 +14,7 @@
 #include "core/transcode/batch/qvbatchdecoder.h"
 #include "core/transcode/batch/segmentinputs_p.h"
 #include "core/transcode/batch/segmentjoin_p.h"
+#include "core/transcode/batch/segmentspan_p.h"
 #include "core/transcode/task/postprocess_p.h"
 #include "core/transcode/task/qvtaskstate.h"
 #include "core/transcode/task/segmentdurations_p.h"
@@ -237,6 +239,50 @@ int QvBatchTask::restore(const QvTaskState& state, QvDPipeList& decoders, QvEnco
     return QvStatus::ok;
 }
 
+namespace {
+
+// The chapters of a segment as frames of the output, of which `before` come in front of it. Returns how many
+// the segment has.
+long long addChapters(const QvIStream& stream, const QvFramerate& out, long long before, AnyVector& to) {
+    const Any in = stream.decoder->getVideoParam(stream.number, "framerate");
+    if (!in.isFramerate()) return 0;
+    const QvRatio rate = in.asFramerate().rate();
+    const SegmentSpan span = qvSegmentSpan(stream, rate, out.rate());
+    if (const AnyVector* points = stream.params.chapterPoints())
+        for (const Any& point : *points) {
+            const long long frame = point.isInt() ? point.toInt64() - span.first : -1;
+            if (frame < 0 || frame >= span.count) continue;
+            to.append(Any(static_cast<int>(before + QvRatio::multyplyByRatio(frame, out.rate(), rate))));
+        }
+    return span.owed;
+}
+
+// What the segments have for the stream as a whole: their chapters at the places that they get there, and the
+// quality log of the first that has one.
+ProcessParams joinedParams(const std::vector<std::unique_ptr<QvInputSegment>>& segments, std::size_t place,
+                           const Any& rate) {
+    std::vector<const QvIStream*> streams;
+    bool chapters = false;
+    ProcessParams params;
+    for (const auto& segment : segments) {
+        if (segment->status != QvInputSegment::opened || place >= segment->streams.size()) continue;
+        const QvIStream& stream = *segment->streams[place];
+        if (!stream.decoder) continue;
+        streams.push_back(&stream);
+        chapters |= stream.params.chapterPoints() != nullptr;
+        if (const auto log = stream.params.getQualityStatsSetup(); log && !params.getQualityStatsSetup())
+            params.setQualityLog(*log);
+    }
+    if (!chapters || !rate.isFramerate()) return params;
+    AnyVector all;
+    long long before = 0;
+    for (const QvIStream* stream : streams) before += addChapters(*stream, rate.asFramerate(), before, all);
+    if (!all.empty()) params.setChapterPoints(all);
+    return params;
+}
+
+}  // namespace
+
 void QvBatchTask::linkJoined() {
     batchDecoder_ = qvJoinSegments(segments_, encoder());
     QV_ASSERT_MSG(batchDecoder_, unhandled);
@@ -253,7 +299,10 @@ void QvBatchTask::linkJoined() {
             if (!first.streams[i]->decoder || first.streams[i]->type != type) continue;
             const int number = qvOutputNumber(*encoder(), *first.streams[i], i);
             int& next = numbers[type == qvVideoStream ? 0 : 1];
-            QV_ASSERT_MSG(link(batchDecoder_.get(), type, next++, number) >= 0, unhandled);
+            ProcessParams params;
+            if (type == qvVideoStream)
+                params = joinedParams(segments_, i, batchDecoder_->getVideoParam(next, "framerate"));
+            QV_ASSERT_MSG(link(batchDecoder_.get(), type, next++, number, params) >= 0, unhandled);
         }
 }
 
@@ -272,7 +321,13 @@ QvBatchTask* QvBatchTask::fromState(const QvTaskState& state, QvDPipeList& decod
                                     QvEncodePipe** encoderOut, int options, QvFileOpenCb* callback,
                                     Any* error) {
     auto task = std::make_unique<QvBatchTask>();
-    const int result = task->restore(state, decoders, encoderOut, options, callback);
+    int result = QvStatus::ok;
+    try {
+        result = task->restore(state, decoders, encoderOut, options, callback);
+    } catch (const QvException&) {
+        if (error && *task->errorDesc()) *error = Any(task->errorDesc());
+        throw;
+    }
     if (result == QvStatus::ok || result == QvStatus::warning) return task.release();
     if (error) *error = Any(task->errorDesc());
     return nullptr;

@@ -447,7 +447,7 @@ QvTask* QvTaskFile::open(const Any& file, QvDPipeList& decoders, QvEncodePipe** 
         } catch (const QvMemoryFailure&) {
             throw;
         } catch (const QvException&) {
-            error = "an input can't be opened, or lacks a stream";
+            if (!error.isValid()) error = "an input can't be opened, or lacks a stream";
         }
         if (!task) return {QvStatus::failed, "files", 0, error.asString("")};
         for (int i = 0; i < opened.size(); ++i) decoders.append(opened.at(i));

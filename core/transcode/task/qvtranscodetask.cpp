@@ -7,6 +7,7 @@
 
 #include "core/arch/formattext_p.h"
 #include "core/arch/qvassert.h"
+#include "core/arch/qvexception.h"
 #include "core/decode/qvdecoder.h"
 #include "core/decode/qvinputstream.h"
 #include "core/encode/qvencodepipe.h"
@@ -391,7 +392,13 @@ QvTask* QvTask::fromState(const AnyDict& state, QvDPipeList& decoders, QvEncodeP
                           QvFileOpenCb* callback, Any* error) {
     auto task = std::make_unique<QvTask>();
     QvEncodePipe* pipe = nullptr;
-    const int result = task->restore(state, decoders, &pipe, options, callback);
+    int result = QvStatus::ok;
+    try {
+        result = task->restore(state, decoders, &pipe, options, callback);
+    } catch (const QvException&) {
+        if (error && *task->errorDesc()) *error = Any(task->errorDesc());
+        throw;
+    }
     if (result == QvStatus::ok || result == QvStatus::warning) {
         if (encoderOut) *encoderOut = pipe;
         return task.release();

@@ -21,12 +21,33 @@ const char* printable(const Any& text, Any& holder) {
     return holder.isString() ? holder.asString() : "";
 }
 
-AnyDict storedSource(const TransLink& link) {
+// A decoder that joins others can't be opened from a file: their own entries stand in its place.
+void appendFiles(const QvDecodePipe& decoder, AnyVector& files) {
+    if (const Any joined = decoder.QvCodec::getParam("segmentFiles"); joined.isVector()) {
+        files.extend(joined.asVector());
+        return;
+    }
+    AnyDict file, own;
+    file.set("filename", decoder.QvCodec::getParam("filename"));
+    decoder.store(own);
+    file.set("decoder", own);
+    files.append(file);
+}
+
+// One for each segment of what is linked.
+AnyVector storedSources(const TransLink& link) {
+    if (link.decoder()->QvCodec::getParam("segmentSources").isVector()) {
+        Any joined = Pair(link.type(), link.decStreamNr());
+        link.decoder()->getParam("segmentSources", joined);
+        return joined.asVector();
+    }
     AnyDict source;
     source.set("file", link.decoder()->QvCodec::getParam("filename"));
     source.set("stream", Any(Pair(link.type(), link.decStreamNr())));
     source.set("process", static_cast<const AnyDict&>(link.processParams()));
-    return source;
+    AnyVector sources;
+    sources.append(source);
+    return sources;
 }
 
 // The processing parameters of source 0 of the number-th stored stream of a type.
@@ -80,7 +101,7 @@ class ForgetEncoder {
 
 TaskFault damaged(const char* text) { return {QvStatus::invalidStructure, text}; }
 
-int linkStoredStream(QvTask& task, const AnyDict& entry, int index, const QvDPipeList& decoders) {
+TaskFault linkStoredStream(QvTask& task, const AnyDict& entry, int index, const QvDPipeList& decoders) {
     QvEncodePipe& pipe = *task.encoder();
     QvOStream* stream = pipe.streamAt(index);
     const int number = pipe.streamNr(stream);
@@ -88,7 +109,7 @@ int linkStoredStream(QvTask& task, const AnyDict& entry, int index, const QvDPip
     const AnyVector sources = entry.getVector("sources");
     if (sources.empty() || !sources.at(0).isDict()) {
         qv_dbg()->warning("QvTask::restore: No source(s) defined for stream %d", index);
-        return QvStatus::ok;
+        return {};
     }
     const AnyDict& source = sources.at(0).asDict();
     QV_ASSERT(source.get("file").isText() && source.get("stream").isPair());
@@ -98,10 +119,18 @@ int linkStoredStream(QvTask& task, const AnyDict& entry, int index, const QvDPip
     while (decoder && task.linkedTo(decoder, address.first, address.second) >= 0)
         decoder = decoders.findByFilename(source.get("file"), decoder);
     QV_ASSERT_MSG(decoder, "no available decoders, decoder must be cloned...");
+    // A decoder would only assert it, without the name of the file.
+    if (address.second < 0 || address.second >= decoder->nrStreams(address.first)) {
+        Any name;
+        return {QvStatus::failed, std::string(printable(source.get("file"), name)) + " has no " +
+                                      QvTask::typeName(address.first) + " stream " +
+                                      std::to_string(address.second)};
+    }
     if (!decoder->isSelected(address.first, address.second)) decoder->select(address.first, address.second);
     ProcessParams params;
     params.update(source.getDict("process"));
-    return task.link(decoder, address.first, address.second, number, params);
+    const int result = task.link(decoder, address.first, address.second, number, params);
+    return {std::min(result, 0), ""};
 }
 
 }  // namespace
@@ -125,13 +154,7 @@ void store(const QvTask& task, AnyDict& dict) {
     dict.set("__class__", "TranscodeTask");
     const QvDPipeList& decoders = task.decoders();
     AnyVector files;
-    for (int i = 0; i < decoders.size(); ++i) {
-        AnyDict file, decoder;
-        file.set("filename", decoders.at(i)->QvCodec::getParam("filename"));
-        decoders.at(i)->store(decoder);
-        file.set("decoder", decoder);
-        files.append(file);
-    }
+    for (const QvDecodePipe* const decoder : decoders) appendFiles(*decoder, files);
     dict.set("files", files);
     if (task.postprocessCommand().isValid()) dict.set("postProcess", task.postprocessCommand());
     QvEncodePipe* pipe = task.encoder();
@@ -148,9 +171,7 @@ void store(const QvTask& task, AnyDict& dict) {
         entry.set("type", stream->type);
         if (const TransLink* link = task.getLinkForOutput(stream->type, number)) {
             QV_ASSERT(link->encStreamNr() == number);
-            AnyVector sources;
-            sources.append(storedSource(*link));
-            entry.set("sources", sources);
+            entry.set("sources", storedSources(*link));
         }
         streams.append(entry);
     }
@@ -186,7 +207,7 @@ TaskFault restore(QvTask& task, const AnyDict& state, QvDPipeList& decoders, QvE
     ForgetEncoder forget(task);
     for (int i = 0; i < pipe->nrStreams(); ++i) {
         const AnyDict entry = streams.at(i).isDict() ? streams.at(i).asDict() : AnyDict();
-        if (const int result = linkStoredStream(task, entry, i, decoders); result < 0) return {result, ""};
+        if (TaskFault fault = linkStoredStream(task, entry, i, decoders); fault.code < 0) return fault;
     }
     task.setPostprocessCommand(state.get("postProcess"));
     forget.disarm();

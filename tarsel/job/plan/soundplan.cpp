@@ -211,7 +211,10 @@ void SoundPlanner::addOptions(PlannedStream& stream) const {
         add("--fade", soundFadeState(fade, std::min(stream.sound.channels, 8)),
             "in=" + decimal(fade.in) + " out=" + decimal(fade.out));
     }
-    if (!options_.sound.normalize.empty()) {
+    if (const auto number = static_cast<size_t>(stream.number); number < options_.sound.gains.size()) {
+        for (const AnyDict& state : gainStates(options_.sound.gains[number]))
+            add("--normalize", state, "volume=" + decimal(state.getFloat("volume", 0)));
+    } else if (!options_.sound.normalize.empty()) {
         const SoundTarget target = parseTarget(options_.sound.normalize);
         add("--normalize", normalizerState(target),
             "mode=" + target.mode + " target=" + decimal(target.level));

@@ -65,6 +65,21 @@ class StateBuilder {
         AnyVector streams;
         for (size_t i = 0; i < streams_.size(); ++i)
             streams.append(AnyDict("type", streams_[i].type, "sources", Any(sources[i])));
+        return stateOf(encoder, output, streams);
+    }
+
+    AnyDict buildSound(int sound, const AnyDict& encoder) {
+        const auto stream = std::find_if(streams_.begin(), streams_.end(),
+                                         [&](const auto& s) { return !s.isVideo() && s.number == sound; });
+        AnyVector sources;
+        for (const JoinedSegment& segment : join_.segments) sources.append(soundOf(segment, *stream));
+        AnyVector streams;
+        streams.append(AnyDict("type", qvAudioStream, "sources", Any(sources)));
+        return stateOf(encoder, "", streams);
+    }
+
+  private:
+    AnyDict stateOf(const AnyDict& encoder, const std::string& output, const AnyVector& streams) const {
         AnyDict state("__version__", "2.0", "__class__", "TranscodeTask");
         state.set("encoder", encoder);
         if (!output.empty()) state.set("filename", output.c_str());
@@ -73,7 +88,6 @@ class StateBuilder {
         return state;
     }
 
-  private:
     // At the rate of the output's first picture; 0 without one.
     long long lengthInFrames(const JoinedSegment& segment) const {
         if (const PlannedStream* const video = findStream(segment.plan, qvVideoStream, 0))
@@ -92,14 +106,29 @@ class StateBuilder {
     AnyDict sourceOf(const JoinedSegment& segment, const PlannedStream& stream, SegmentPlace place) {
         const PlannedStream* const own = findStream(segment.plan, stream.type, stream.number);
         if (!own) return generated(segment, stream);
-        AnyDict source("file", inputOf(segment, *own).get("filename"));
-        source.set("stream", Any(Pair(own->type, own->part.stream)));
         PlannedStream divided = *own;
         alignToFrames(segment.plan, divided.part);
         place.first = own->isVideo() ? own->part.in.position(own->picture.rate) : 0;
         place.rate = own->picture.rate;
         moveTexts(divided.filters, place);
-        source.set("process", static_cast<const AnyDict&>(divided.params()));
+        return read(segment, divided);
+    }
+
+    AnyDict soundOf(const JoinedSegment& segment, const PlannedStream& stream) {
+        const PlannedStream* const own = findStream(segment.plan, qvAudioStream, stream.number);
+        if (!own) return generated(segment, stream);
+        PlannedStream alone = *own;
+        alignToFrames(segment.plan, alone.part);
+        alone.part.whole = false;
+        alone.part.out = std::min(alone.part.out, alone.part.in + lengthOf(segment.plan));
+        alone.conversion.dither = AudioConversion().dither;
+        return read(segment, alone);
+    }
+
+    AnyDict read(const JoinedSegment& segment, const PlannedStream& stream) const {
+        AnyDict source("file", inputOf(segment, stream).get("filename"));
+        source.set("stream", Any(Pair(stream.type, stream.part.stream)));
+        source.set("process", static_cast<const AnyDict&>(stream.params()));
         return source;
     }
 
@@ -162,4 +191,8 @@ std::vector<PlannedStream> Join::streams() const {
 
 AnyDict joinedState(const Join& join, const AnyDict& encoder, const std::string& output) {
     return StateBuilder(join).build(encoder, output);
+}
+
+AnyDict joinedSoundState(const Join& join, int sound, const AnyDict& encoder) {
+    return StateBuilder(join).buildSound(sound, encoder);
 }

@@ -26,3 +26,5 @@ struct Join {
 
 // `encoder`: the stored output. Where a segment lacks a stream, a generated one is black or silent.
 AnyDict joinedState(const Join& join, const AnyDict& encoder, const std::string& output);
+// One sound of the output alone, as far as the pictures go and without dither. It is not written anywhere.
+AnyDict joinedSoundState(const Join& join, int sound, const AnyDict& encoder);

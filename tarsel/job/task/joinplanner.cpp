@@ -46,7 +46,6 @@ JoinPlanner::JoinPlanner(const PlanOptions& options, const OutputForm& form, Ope
     if (options.join && !options.cuts.empty()) throw failure(Msg::optionsExclude, {"--join", "--cut"});
     if (points) throw failure(Msg::optionsExclude, {how, "--from, --to and --duration"});
     refuse(!options.sound.delay.empty(), "--delay");
-    refuse(!options.sound.normalize.empty(), "--normalize");
     for (const std::string& spec : options.effects.filters) requireDivisible(spec.substr(0, spec.find(':')));
     join_.ofCuts = !options.join;
 }
@@ -68,6 +67,16 @@ void JoinPlanner::plan() {
     checkEffects(whole_, options_.effects);
     if (const std::string given = options_.sound.given(); !given.empty() && known_.sounds.empty())
         throw failure(Msg::effectNoSound, {given});
+}
+
+bool JoinPlanner::levelIsCommon() const {
+    const size_t segments = options_.join ? options_.inputs.size() : options_.cuts.size();
+    return !options_.sound.normalize.empty() && segments > 1;
+}
+
+std::unique_ptr<JoinLevel> JoinPlanner::level() const {
+    if (!levelIsCommon() || !options_.sound.gains.empty()) return nullptr;
+    return std::make_unique<JoinLevel>(join_, parseTarget(options_.sound.normalize), name());
 }
 
 std::string JoinPlanner::name() const {
@@ -98,6 +107,8 @@ PlanOptions JoinPlanner::optionsOf(const SegmentWords& words, const std::vector<
         options.sound = SoundOptions();
     std::optional<QvFramerate> rate;
     if (!hasPicture && !known_.pictures.empty()) rate = known_.pictures.front().rate;
+    // A gain of its own for each would not keep how loud they are to each other.
+    if (levelIsCommon()) options.sound.normalize.clear();
     options.effects.fade = fadeOf(options_.effects.fade, first, last, rate);
     return options;
 }

@@ -8,6 +8,7 @@
 
 #include "tarsel/job/plan/jobplan.h"
 #include "tarsel/job/task/join.h"
+#include "tarsel/job/task/joinlevel.h"
 #include "tarsel/source/segmentwords.h"
 
 class JoinPlanner {
@@ -22,12 +23,16 @@ class JoinPlanner {
     const Join& join() const { return join_; }
     // The output as a whole, without inputs.
     const JobPlan& whole() const { return whole_; }
+    // What the level of the sounds is to be measured by before they are planned again with a gain; null where
+    // none is asked for or the options have the gains.
+    std::unique_ptr<JoinLevel> level() const;
     // What is read: inputs, and the files of filters.
     const std::vector<std::string>& files() const { return files_; }
     // For messages: the first input, and how many segments there are.
     std::string name() const;
 
   private:
+    bool levelIsCommon() const;
     std::vector<SegmentWords> words() const;
     int inputNumber(const std::string& name);
     PlanOptions optionsOf(const SegmentWords& words, const std::vector<JobInput>& inputs, bool first,

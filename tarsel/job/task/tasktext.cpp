@@ -1,7 +1,8 @@
 #include "tarsel/job/task/tasktext.h"
 
+#include <algorithm>
+
 #include "tarsel/picture/picture.h"
-#include "tarsel/words/json.h"
 #include "tarsel/words/timespec.h"
 
 namespace {
@@ -96,14 +97,19 @@ std::string streamLine(const Json& stream) {
     return line;
 }
 
+std::string rangeOf(const Json& source) {
+    std::string text;
+    if (source.contains("from_s")) text += ", from " + formatTime(source["from_s"].get<double>());
+    if (source.contains("to_s")) text += " to " + formatTime(source["to_s"].get<double>());
+    return text;
+}
+
 std::string sourceLines(const Json& source) {
     if (source.is_null()) return "source   nothing\n";
     std::string text = "source   " + textOf(source["type"]) + " " +
                        std::to_string(source["stream"].get<int>()) + " of " +
                        inQuotes(textOf(source["file"]));
-    if (source.contains("from_s")) text += ", from " + formatTime(source["from_s"].get<double>());
-    if (source.contains("to_s")) text += " to " + formatTime(source["to_s"].get<double>());
-    text += "\n";
+    text += rangeOf(source) + "\n";
     if (source.contains("filters"))
         for (const Json& line : source["filters"]) text += "filter   " + textOf(line) + "\n";
     return text;
@@ -120,7 +126,36 @@ std::string segmentLines(const Json& segments) {
     return text;
 }
 
+std::string briefOf(const Json& segment) {
+    std::string text;
+    for (const Json& source : segment["sources"]) {
+        if (source.is_null()) continue;
+        text += (text.empty() ? "" : ", ") + textOf(source["type"]) + " " +
+                std::to_string(source["stream"].get<int>()) + " of " + inQuotes(textOf(source["file"])) +
+                rangeOf(source);
+    }
+    return (text.empty() ? "nothing" : text) + (segment["enabled"] ? "" : ", switched off");
+}
+
 }  // namespace
+
+std::string taskBrief(const StoredTask& task) {
+    constexpr size_t most = 20;
+    const Json state = describeState(task), &segments = state["segments"];
+    std::string text;
+    for (size_t s = 0; s < std::min(segments.size(), most); ++s)
+        text += "  segment " + std::to_string(s + 1) + "  " + briefOf(segments[s]) + "\n";
+    if (segments.size() > most)
+        text += "  and " + std::to_string(segments.size() - most) + " segments more\n";
+    const std::string output = textOf(state["output"]);
+    return text + "  output     " + (output.empty() ? "nothing" : inQuotes(output)) + " by " +
+           textOf(state["muxer"]) + "\n";
+}
+
+Json taskBriefJson(const StoredTask& task) {
+    const Json state = describeState(task);
+    return Json::object({{"segments", state["segments"]}, {"output", state["output"]}});
+}
 
 std::string segmentsText(const StoredTask& task) {
     return task.isJoin() ? segmentLines(describeState(task)["segments"]) : "";

@@ -116,6 +116,58 @@ TEST_F(Joined, CutsOfOneFileMeetToTheFrameAndSample) {
     EXPECT_TRUE(samples(written(".wav").substr(80)) == heard);
 }
 
+// What is stored is the inputs of the segments, and it is the same after it was restored.
+TEST_F(Joined, AJoinedTaskIsStoredWithItsSegments) {
+    const AnyDict slow = film("a.yuv", 100, 1, f25, 16, 8),
+                  fast = film("b.yuv", 100, 101, QvFramerate(50.0), 16, 8);
+    const AnyDict first = sound("a.wav", 200000, 5, 44100), second = sound("b.wav", 100000, 9, 48000);
+    addBoth(slow, first, cut(0.4, 0.8));
+    addBoth(fast, second, cut(0.2, 0.6));
+    addBoth(slow, first, cut(2, 2.2));
+    const auto made = restore();
+    ASSERT_TRUE(made->task) << made->error;
+    AnyDict stored, again;
+    made->task->store(stored);
+    EXPECT_EQ(run(*made->task), 0);
+    const std::string picture = written(".raw"), heard = written(".wav");
+    EXPECT_EQ(stored.getVector("files").size(), 4);
+    state_ = QvTaskState(stored);
+    EXPECT_EQ(state_.nrSegments(), 3);
+    const auto open = restore();
+    ASSERT_TRUE(open->task) << open->error;
+    open->task->store(again);
+    EXPECT_EQ(again, stored);
+    EXPECT_EQ(run(*open->task), 0);
+    EXPECT_TRUE(written(".raw") == picture && written(".wav") == heard);
+}
+
+// Those outside of a cut go, the others are at the frames of the output.
+TEST_F(Joined, ChaptersAndQualityLogsAreThoseOfTheWhole) {
+    const AnyDict slow = film("a.yuv", 100, 1, f25, 16, 8),
+                  fast = film("b.yuv", 100, 101, QvFramerate(50.0), 16, 8);
+    const auto with = [&](const AnyDict& file, const InOutPoints& points, const AnyVector& chapters,
+                          int logs) {
+        Any made = source(1, file, points);
+        ProcessParams params;
+        params.update(made.asDict().getDict("process"));
+        if (!chapters.empty()) params.setChapterPoints(chapters);
+        if (logs > 0) params.set("qualityStats", AnyVector(Any(AnyDict("number", logs))));
+        made.asDict().set("process", static_cast<const AnyDict&>(params));
+        return made;
+    };
+    state_.set("encoder", output(0));
+    add(AnyVector(with(slow, cut(0.4, 0.8), AnyVector(Any(3), Any(10), Any(19), Any(20)), 0)),
+        AnyVector(slow));
+    add(AnyVector(with(fast, cut(0.2, 0.6), AnyVector(), 1)), AnyVector(fast));
+    add(AnyVector(with(fast, cut(1, 2), AnyVector(Any(50), Any(54)), 2)), AnyVector(fast));
+    const auto open = restore();
+    ASSERT_TRUE(open->task) << open->error;
+    const ProcessParams& params = open->task->getLinkForOutput(1, 0)->processParams();
+    ASSERT_TRUE(params.chapterPoints());
+    EXPECT_EQ(*params.chapterPoints(), AnyVector(Any(0), Any(9), Any(20), Any(22)));
+    EXPECT_EQ(params.get("qualityStats"), Any(AnyVector(Any(AnyDict("number", 1)))));
+}
+
 // A frame of 1001/30000 s has 1471.47 samples of 44100 a second: no seam rounds for the next one.
 TEST_F(Joined, SeamsDoNotAddUpTheirRounding) {
     const QvFramerate ntsc = QvFramerate::f29p();
