@@ -201,7 +201,8 @@ void check(const Given& given) {
             tell(Level::warning,
                  inQuotes(preset.name()) + ": " + inLine(preset.error().toString().asString("")));
     const int invalid = presets.count() - valid;
-    if (invalid > 0) throw failure(Msg::presetsInvalid, {std::to_string(invalid)});
+    const std::string file = given.words.empty() ? PresetStore::fileName() : given.words[0];
+    if (invalid > 0) throw failure(Msg::presetsInvalid, {file, std::to_string(invalid)});
     say(std::to_string(valid) + " presets are sound");
 }
 

@@ -187,7 +187,7 @@ constexpr Message kMessages[] = {
     {Msg::presetUnknown,     Exit::usage,  "there is no preset {name}",              "neither its name nor its symbol is known",              "{hint}'tarsel presets list --all' lists all"},
     {Msg::presetWaits,       Exit::module, "the preset {name} can't be used",        "it waits for one of these modules: {text}",             "load the plug-in that has it with --plugins"},
     {Msg::presetBuiltin,     Exit::usage,  "the preset {name} can't be changed",     "it is built in",                                        "save one of your own with 'tarsel presets save'"},
-    {Msg::presetInvalid,     Exit::module, "the preset {name} can't be used",        "{system}",                                              "'tarsel presets check' tells what is wrong with your presets"},
+    {Msg::presetInvalid,     Exit::module, "the preset {name} can't be used",        "{system}",                                              "'tarsel presets check' lists what is wrong with your presets"},
     {Msg::presetMuxer,       Exit::usage,  "--muxer {text}",                         "the preset {name} does not go with it",                 "use one of {text}, or leave it out"},
     {Msg::presetNoStream,    Exit::usage,  "the preset {name} takes no further {text} stream", "{system}",                                    "leave streams out with --no-video, --no-audio or --map"},
     {Msg::presetRange,       Exit::usage,  "{option}",                               "{text} takes {text}",                                   "give one of these, or use --match to fit the output to the input"},
@@ -202,7 +202,7 @@ constexpr Message kMessages[] = {
     {Msg::presetsNotWritten, Exit::output, "can't change {file}",                    "{text}",                                                "{text}"},
     {Msg::presetLeavesOut,   Exit::done,   "the preset {name} has no {text}",        "that of the inputs is left out",                        ""},
     {Msg::presetCommandLeft, Exit::done,   "the preset {name} has a command for afterwards", "it was not run",                               "give it as --post to run it: {file}"},
-    {Msg::presetsInvalid,    Exit::module, "{text} of your presets can't be used",   "what they rest on is not installed",                    "load the plug-ins that they need with --plugins, or remove them"},
+    {Msg::presetsInvalid,    Exit::module, "not all presets of {file} can be used", "{text} of them rest on what is not installed",         "load the plug-ins that they need with --plugins, or remove them"},
     {Msg::outputNoModule,    Exit::module, "can't write {file}",                     "this installation can't write any output",              "install the engine again"},
     {Msg::aviNoModule,       Exit::module, "can't write {file}",                     "this installation has no AVI output",                   "choose another format"},
     // captions

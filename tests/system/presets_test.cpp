@@ -210,7 +210,7 @@ TEST_F(Presets, LightUpWithTheModulesOfPlugins) {
     works(coded(job + Words{"-o", "x.h264"}));
     EXPECT_EQ(contents("x.h264"), "320x240\n320x240\n320x240\n320x240\n320x240\n");
     works(coded(job + Words{"-o", "y.h264", "--match"}));
-    EXPECT_EQ(std::count(contents("y.h264").begin(), contents("y.h264").end(), '\n'), 10);
+    EXPECT_EQ(contents("y.h264").size(), 10 * std::strlen("640x360\n"));
     EXPECT_EQ(contents("y.h264").substr(0, 8), "640x360\n");
     works(coded(job + Words{"-o", "z.h264", "--preset", "h.264 main", "--size", "160x96"}));
     EXPECT_EQ(contents("z.h264").substr(0, 7), "160x96\n");
