@@ -44,11 +44,11 @@ std::unique_ptr<QvEncodePipe> plainPipe(const JobPlan& plan) {
     const OutputForm& output = plan.output;
     std::unique_ptr<QvEncodePipe> pipe(QvEncodePipe::create());
     if (!pipe) throw failure(Msg::outputNoModule, {output.name});
-    if (output.kind == OutputKind::avi && !output.writesNothing()) {
-        if (!qvPresetMgr()->profileAvailable(QvProfile::aviRaw))
-            throw failure(Msg::aviNoModule, {output.name});
-        pipe->applyPreset(QvProfile::aviRaw, 0);
-    }
+    // The first preset, with which a pipe begins, may be one of a plug-in.
+    const bool toAvi = output.kind == OutputKind::avi && !output.writesNothing();
+    if (toAvi && !qvPresetMgr()->profileAvailable(QvProfile::aviRaw))
+        throw failure(Msg::aviNoModule, {output.name});
+    pipe->applyPreset(toAvi ? QvProfile::aviRaw : QvProfile::raw, 0);
     pipe->clearStreams();
     setMuxer(*pipe, output);
     for (const PlannedStream& stream : plan.streams) addStream(*pipe, output, stream);

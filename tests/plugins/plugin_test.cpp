@@ -88,13 +88,15 @@ TEST_F(Plugins, PresetsComeAndGoWithTheFile) {
     bring("presets_plugin.so");
     EXPECT_EQ(registry.scanFolder(narrow(folder.path().string())), 0);
     const QvPresetMgr& catalogue = *qvPresetMgr();
-    ASSERT_EQ(catalogue.builtinPresets().size(), 4);
+    ASSERT_EQ(catalogue.builtinPresets().size(), 5);
+    EXPECT_STREQ(catalogue.builtinPreset(0).name(), "H.264 / SVC");
     EXPECT_TRUE(log.contains("[Preset] Plug-in 'presets': preset 2 left out"));
-    EXPECT_EQ(catalogue.builtinGroups().findByName("Sound"), 1);
-    EXPECT_EQ(catalogue.extendedGroups()[1].id(), 200);
+    EXPECT_EQ(catalogue.builtinGroups().findByName("Sound"), 2);
+    EXPECT_EQ(catalogue.extendedGroups()[2].id(), 200);
     {
         const std::unique_ptr<QvEncodePipe> pipe(QvEncodePipe::create());
         ASSERT_TRUE(pipe);
+        EXPECT_STREQ(pipe->videoEncoder(0)->name(), "svcvenc");
         EXPECT_EQ(pipe->applyPreset(0x2800001, 0), 0) << pipe->errorDesc();
         EXPECT_TRUE(pipe->nrVideoStreams() == 0 && pipe->nrAudioStreams() == 1);
         const QvPreset preset(pipe.get(), "mine");

@@ -33,6 +33,19 @@ std::string notLoaded(const std::string& name, const std::string& reason) {
            "\n";
 }
 
+// Outputs that need no plug-in, with one whose preset is the first of the list.
+TEST_F(PluginTool, PresetsOfPluginsLeaveOtherOutputsAlone) {
+    bring("pcm8_plugin.so", "good_plugin.so");
+    bring("presets_plugin.so", "presets_plugin.so");
+    const Outcome sound = transcode();
+    EXPECT_EQ(sound.status, 0) << sound.err;
+    for (const char* name : {"out.i420", "out.avi", "out.wav", "/dev/null"}) {
+        const Outcome o = tarsel(
+            {"--plugins", "plugins", "transcode", "testgen:size=64x48,rate=25,duration=1", "-y", "-o", name});
+        EXPECT_EQ(o.status, 0) << name << ": " << o.err;
+    }
+}
+
 TEST_F(PluginTool, NamesEachOneThatDoesNotLoadAndGoesOn) {
     bring("pcm8_plugin.so", "good_plugin.so");
     fs::resize_file(bring("pcm8_plugin.so", "a_plugin.so"), 40000);
