@@ -103,7 +103,7 @@ int run(int argc, char** argv) {
     addScope(line, signals);
     addModules(line);
     addFormats(line);
-    addPresets(line);
+    addPresets(line, signals);
     addRecover(line);
     const CommandLine::Parsed parsed = parse(line, argc, argv, version);
     if (!parsed.action) {

@@ -13,7 +13,7 @@ void addLoudness(CommandLine& line);
 void addCaptions(CommandLine& line, Signals& signals);
 void addModules(CommandLine& line);
 void addFormats(CommandLine& line);
-void addPresets(CommandLine& line);
+void addPresets(CommandLine& line, Signals& signals);
 void addRecover(CommandLine& line);
 void addRun(CommandLine& line, Signals& signals, const std::string& version);
 void addTask(CommandLine& line, Signals& signals);

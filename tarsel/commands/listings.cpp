@@ -1,4 +1,4 @@
-// What this installation can do: presets and formats.
+// What this installation can read and write.
 #include "tarsel/commands/commands.h"
 #include "tarsel/host/console.h"
 #include "tarsel/words/commandline.h"
@@ -7,25 +7,6 @@
 #include "tarsel/words/timespec.h"
 
 namespace {
-
-Json presets() {
-    Json list = Json::array();
-    const QvPresetList& all = qvPresetMgr()->builtinPresets();
-    const auto names = [](const AnyVector& modules) {
-        Json row = Json::array();
-        for (int i = 0; i < modules.size(); ++i) row.push_back(modules.at(i).asString());
-        return row;
-    };
-    for (int i = 0; i < all.size(); ++i) {
-        const QvPreset preset = all.preset(i);
-        list.push_back({{"name", preset.name()},
-                        {"symbol", preset.symbol()},
-                        {"video", names(preset.videoCodecs())},
-                        {"audio", names(preset.audioCodecs())},
-                        {"muxers", names(preset.muxers())}});
-    }
-    return list;
-}
 
 struct Output {
     const char* extensions;
@@ -97,14 +78,6 @@ void add(CommandLine& line, const char* name, const char* help, Json (*make)(), 
 }
 
 }  // namespace
-
-void addPresets(CommandLine& line) {
-    add(line, "presets", "List the presets that the installed modules allow", presets, [](const Json& list) {
-        for (const auto& p : list)
-            print("%-24s video %s; audio %s; %s\n", p["name"].get<std::string>().c_str(),
-                  joined(p["video"]).c_str(), joined(p["audio"]).c_str(), joined(p["muxers"]).c_str());
-    });
-}
 
 void addFormats(CommandLine& line) {
     add(line, "formats", "List what can be read and written", formats, [](const Json& data) {

@@ -1,8 +1,11 @@
+#include <algorithm>
+
 #include "tarsel/commands/commands.h"
 #include "tarsel/commands/outputoptions.h"
 #include "tarsel/commands/progressoption.h"
 #include "tarsel/host/signals.h"
 #include "tarsel/job/job.h"
+#include "tarsel/job/plan/outputform.h"
 #include "tarsel/words/commandline.h"
 #include "tarsel/words/messages.h"
 #include "tarsel/words/rawnames.h"
@@ -24,6 +27,27 @@ int parseBits(const std::string& text) {
     throw failure(Msg::bitsWrong, {"--bits", text});
 }
 
+// Of a name that the tool gives no meaning itself, the extension may say the preset.
+void choosePreset(JobOptions& job) {
+    const bool writes = job.muxer != "nullmux";
+    const std::string extension = writes && !job.output.empty() ? formatName(job) : "";
+    if (!job.presetName.empty() || (!extension.empty() && !writesItself(extension)))
+        job.preset = outputPreset(job.presetName, extension, writes ? job.muxer : "");
+    if (!job.preset && job.match) throw failure(Msg::matchNoPreset);
+    if (!job.preset) return;
+    const QvPreset& preset = job.preset->preset();
+    const std::string command = preset.isCustom() ? preset.postprocessCmd().toString().asString("") : "";
+    if (!command.empty() && job.post.empty())
+        job.warnings.push_back(lineOf(Msg::presetCommandLeft, {preset.name(), command}));
+}
+
+void checkMuxer(const JobOptions& job) {
+    if (job.preset || job.muxer.empty()) return;
+    const std::vector<std::string> own = {"rawmux", "rawavimux", "nullmux"};
+    if (std::find(own.begin(), own.end(), job.muxer) == own.end())
+        throw failure(Msg::muxerUnknown, {job.muxer, suggestion(job.muxer, own)});
+}
+
 void resolve(Given& given) {
     JobOptions& job = given.job;
     job.effects.check();
@@ -40,9 +64,8 @@ void resolve(Given& given) {
     if (!given.channels.empty())
         job.channels = static_cast<int>(parseNumber(given.channels, 1, 8, "--channels"));
     if (!given.bits.empty()) job.bits = parseBits(given.bits);
-    if (!job.muxer.empty() && job.muxer != "nullmux" && job.muxer != "rawmux" && job.muxer != "rawavimux")
-        throw failure(Msg::muxerUnknown,
-                      {job.muxer, suggestion(job.muxer, {"rawmux", "rawavimux", "nullmux"})});
+    choosePreset(job);
+    checkMuxer(job);
 }
 
 void openEvents(Given& given, const std::string& version) {
@@ -77,6 +100,8 @@ void addTranscode(CommandLine& line, Signals& signals, const std::string& versio
                    "What to write; the extension says how. - is the standard output", "FILE");
     command.option("--format", job.format, "What to write, in the place of an extension: wav, raw, ...",
                    "EXT", outputFormats());
+    command.option("--preset", job.presetName, "What the output is to be, see 'tarsel presets list'", "NAME");
+    command.flag("--match", job.match, "Fit what the preset allows to the INPUT");
     command.flag("--join", job.join,
                  "The INPUTs are segments NAME[@FROM-TO], one after the other; A+B is read side by side");
     command.list("--cut", job.cuts, "A part of the INPUTs; several are joined in this order", "FROM-TO");
@@ -93,8 +118,8 @@ void addTranscode(CommandLine& line, Signals& signals, const std::string& versio
     command.option("--bits", given->bits, "Bits of a sample: 8, 16 or 24", "N");
     command.flag("--shortest", job.shortest, "End the picture with its sound");
     command.flag("--longest", job.longest, "Hold the last picture until the sound has ended");
-    command.option("--muxer", job.muxer, "nullmux: do everything but write", "NAME",
-                   {"nullmux", "rawmux", "rawavimux"});
+    command.option("--muxer", job.muxer, "nullmux: do everything but write; or one that the preset allows",
+                   "NAME", {"nullmux", "rawmux", "rawavimux"});
     command.option("--post", job.post,
                    "A command run afterwards; %i and %o stand for the inputs and outputs, %o1 for the first",
                    "CMD");

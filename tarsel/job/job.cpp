@@ -26,11 +26,13 @@ Job::Job(const JobOptions& options, Signals& signals)
       warnings_(options.warnings) {
     if (options_.inputs.empty()) throw failure(Msg::inputMissing);
     if (options_.joins()) {
+        if (options_.match) throw failure(Msg::joinRefuses, {"--match"});
         joinInputs();
         return;
     }
     openInputs();
     joinSounds();
+    if (options_.match) fitToInputs();
     begin(planJob(options_, parts_.outputs.form(), readInputs()));
 }
 
@@ -96,6 +98,29 @@ void Job::joinInputs() {
         plan.notes.push_back(lineOf(Msg::joinLevelLater));
     plan.filterFiles.read = planner.files();
     begin(std::move(plan));
+}
+
+// Each property by itself: an encoder need not have all of them.
+void Job::fitToInputs() {
+    options_.fit = [this](int type, int input, int stream, QvEncoder& encoder) {
+        using Matcher = QvFormatMatcher;
+        const QvDecodePipe& decoder = parts_.sources[static_cast<size_t>(input)]->decoder();
+        static constexpr int properties[] = {Matcher::type,         Matcher::dimensions | Matcher::framerate,
+                                             Matcher::frameAspect,  Matcher::videoBitrate,
+                                             Matcher::gop,          Matcher::channels,
+                                             Matcher::samplerate,   Matcher::audioBitrate,
+                                             Matcher::bitsPerSample};
+        for (const int property : properties) {
+            const Matcher matcher(property, 0, &options_.preset->preset());
+            try {
+                if (type == qvVideoStream)
+                    matcher.matchVideo(&decoder, stream, static_cast<QvVideoEncoder*>(&encoder));
+                else
+                    matcher.matchAudio(&decoder, stream, static_cast<QvAudioEncoder*>(&encoder));
+            } catch (const QvParamException&) {  // not one of its parameters
+            }
+        }
+    };
 }
 
 std::vector<JobInput> Job::readInputs() const {

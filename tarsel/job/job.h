@@ -39,6 +39,7 @@ class Job {
     std::unique_ptr<Source> openInput(const std::string& name);
     void openInputs();
     void joinInputs();
+    void fitToInputs();
     void joinSounds();
     std::vector<JobInput> readInputs() const;
     std::vector<std::string> filesRead() const;

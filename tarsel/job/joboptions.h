@@ -13,6 +13,8 @@ struct JobOptions : PlanOptions {
     std::string post;  // command that is run afterwards
     ProgressMode progress;
     OutputPolicy policy{false};
+    std::string presetName;  // a preset's name or symbol
+    bool match = false;      // fit what the preset leaves open, and what it can do, to the inputs
     bool dryRun = false, quiet = false;
     bool relative = false;              // the task file has names that count from its folder
     bool strict = false;                // warnings are failures

@@ -39,7 +39,7 @@ void JobOutputs::checkNumbers(const JobPlan& plan) {
     if (form_.kind == OutputKind::pictures) files_->checkNumbered("png", pictures);
     if (form_.splitChannels) files_->checkNumbered("wav", channels);
     if (form_.kind == OutputKind::pictures || form_.splitChannels ||
-        (form_.kind != OutputKind::avi && plan.streams.size() > 1) || form_.numbered)
+        (!form_.isOneFile() && plan.streams.size() > 1) || form_.numbered)
         files_->expectSet();
 }
 

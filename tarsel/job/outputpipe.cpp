@@ -1,8 +1,8 @@
 #include "tarsel/job/outputpipe.h"
 
 #include <string_view>
-#include <utility>
 
+#include "tarsel/job/plan/presetplan.h"
 #include "tarsel/source/source.h"
 #include "tarsel/words/messages.h"
 
@@ -22,31 +22,25 @@ void setMuxer(QvEncodePipe& pipe, const OutputForm& output) {
     if (output.splitChannels && !toStream) setChecked(m, "splitAudio", 1, "--split-channels");
 }
 
-void setPicture(QvEncoder& encoder, const PictureFormat& picture) {
-    setChecked(encoder, "type", static_cast<int>(picture.fourcc), "--pixel");
-    for (const auto& [name, value] : {std::pair{"width", picture.width}, std::pair{"height", picture.height}})
-        if (static_cast<QvCodec&>(encoder).setParam(name, value) != QvStatus::ok)
-            throw failure(Msg::frameTooLarge,
-                          {"--size", std::to_string(picture.width) + "x" + std::to_string(picture.height)});
-    setChecked(encoder, "framerate", Any(picture.rate), "--rate");
-}
-
-void setSound(QvEncoder& encoder, const SoundFormat& sound) {
-    setChecked(encoder, "samplerate", sound.samplerate, "--samplerate");
-    setChecked(encoder, "channels", sound.channels, "--channels");
-    setChecked(encoder, "bitsPerSample", sound.bits, "--bits");
-}
-
 void addStream(QvEncodePipe& pipe, const OutputForm& output, const PlannedStream& stream) {
     if (pipe.addStream(stream.type, Any(stream.encoder().c_str())) < 0)
         throw failure(Msg::outputNoStream, {output.name, stream.isVideo() ? "picture" : "sound"});
-    QvEncoder& encoder = *pipe.encoder(stream.type, stream.number);
-    stream.isVideo() ? setPicture(encoder, stream.picture) : setSound(encoder, stream.sound);
+    setFormat(*pipe.encoder(stream.type, stream.number), stream);
 }
 
-}  // namespace
+// The settings of the streams are those that the plan has found.
+std::unique_ptr<QvEncodePipe> presetPipe(const JobPlan& plan) {
+    auto pipe = plan.preset->makePipe(plan.output.muxer());
+    setMuxer(*pipe, plan.output);
+    for (const PlannedStream& stream : plan.streams) {
+        QvEncoder& encoder = plan.preset->addStream(*pipe, stream.type);
+        encoder.restore(stream.codec);
+        setFormat(encoder, stream);
+    }
+    return pipe;
+}
 
-std::unique_ptr<QvEncodePipe> makeOutputPipe(const JobPlan& plan, bool acceptPartial) {
+std::unique_ptr<QvEncodePipe> plainPipe(const JobPlan& plan) {
     const OutputForm& output = plan.output;
     std::unique_ptr<QvEncodePipe> pipe(QvEncodePipe::create());
     if (!pipe) throw failure(Msg::outputNoModule, {output.name});
@@ -58,6 +52,13 @@ std::unique_ptr<QvEncodePipe> makeOutputPipe(const JobPlan& plan, bool acceptPar
     pipe->clearStreams();
     setMuxer(*pipe, output);
     for (const PlannedStream& stream : plan.streams) addStream(*pipe, output, stream);
+    return pipe;
+}
+
+}  // namespace
+
+std::unique_ptr<QvEncodePipe> makeOutputPipe(const JobPlan& plan, bool acceptPartial) {
+    auto pipe = plan.preset ? presetPipe(plan) : plainPipe(plan);
     fitToPlace(*pipe, plan, acceptPartial);
     return pipe;
 }

@@ -164,18 +164,21 @@ void Command::argument(const char* name, std::string& to, const char* help, Need
 }
 
 void Command::choiceArgument(const char* name, std::string& to, const char* help,
-                             const std::vector<std::string>& values) {
+                             const std::vector<std::string>& values, Need need) {
     const auto known = [name, values](const std::string& word) {
         if (std::find(values.begin(), values.end(), word) == values.end())
             throw failure(Msg::choiceUnknown, {name, word, suggestion(word, values), joined(values)});
         return std::string();
     };
-    line_.taken_.push_back(
-        {app_.add_option(name, to, help)->required()->check(known), CommandLine::Kind::value, values, {}});
+    line_.taken_.push_back({app_.add_option(name, to, help)->required(need == Need::required)->check(known),
+                            CommandLine::Kind::value,
+                            values,
+                            {}});
 }
 
-void Command::arguments(const char* name, std::vector<std::string>& to, const char* help, int most) {
-    CLI::Option* words = app_.add_option(name, to, help)->required();
+void Command::arguments(const char* name, std::vector<std::string>& to, const char* help, int most,
+                        Need need) {
+    CLI::Option* words = app_.add_option(name, to, help)->required(need == Need::required);
     if (most > 0) words->expected(1, most);
 }
 

@@ -74,9 +74,9 @@ class Command {
     void argument(const char* name, std::string& to, const char* help, Need need = Need::required);
     // A word that is one of `values`.
     void choiceArgument(const char* name, std::string& to, const char* help,
-                        const std::vector<std::string>& values);
-    void arguments(const char* name, std::vector<std::string>& to, const char* help,
-                   int most = 0);  // 0: any number
+                        const std::vector<std::string>& values, Need need = Need::required);
+    void arguments(const char* name, std::vector<std::string>& to, const char* help, int most = 0,
+                   Need need = Need::required);  // 0: any number
 
     void option(const char* names, std::string& to, const char* help, const char* type,
                 Need need = Need::optional);

@@ -32,6 +32,8 @@ JOBS = [
     Job("cut", ["transcode", *CLIP, "--from", "0.2", "--to", "0.6", "-o", "part.yuv", "-y"],
         ["transcode", *CLIP, "--to", "0.2", "-o", "part.yuv", "-y"]),
     Job("avi", card("--pixel", "I420", "-o", "card.avi"), card("--pixel", "YUYV", "-o", "card.avi")),
+    Job("preset", card("--preset", "Uncompressed AVI", "--match", "--pixel", "I420", "-o", "made.avi"),
+        card("--pixel", "YUYV", "-o", "made.avi")),
     Job("pictures", card("-o", "card.png"), card("-o", "card.png", length=0.28, size="48x64")),
     Job("channels", ["transcode", "in.wav", "--split-channels", "-o", "ch.wav", "-y"],
         ["transcode", "in3.wav", "--split-channels", "-o", "ch.wav", "-y"]),

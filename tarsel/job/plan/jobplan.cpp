@@ -6,6 +6,7 @@
 #include "tarsel/job/plan/filters.h"
 #include "tarsel/job/plan/lengths.h"
 #include "tarsel/job/plan/points.h"
+#include "tarsel/job/plan/presetplan.h"
 #include "tarsel/job/plan/soundplan.h"
 #include "tarsel/words/messages.h"
 #include "tarsel/words/timespec.h"
@@ -22,12 +23,22 @@ SoundFormat soundFormat(const PlanOptions& options, const SoundFormat& in) {
             options.bits.value_or(in.bits)};
 }
 
+// What a preset has no stream for is left out, with a word.
+bool lacks(JobPlan& plan, const JobInput& input, int type) {
+    if (!plan.preset || plan.preset->has(type)) return false;
+    if (!input.streams(type).empty())
+        plan.warnings.push_back(
+            lineOf(Msg::presetLeavesOut, {plan.preset->name(), type == qvVideoStream ? "picture" : "sound"}));
+    return true;
+}
+
 void takeStreams(JobPlan& plan, const PlanOptions& options, const KnownFormats* known) {
     for (size_t input = 0; input < plan.inputs.size(); ++input) {
         if (plan.inputs[input].joined) continue;
         for (const int type : {qvVideoStream, qvAudioStream}) {
             if (unwanted(options, type) || (type == qvVideoStream && plan.output.kind == OutputKind::wav))
                 continue;
+            if (lacks(plan, plan.inputs[input], type)) continue;
             // --map chooses one of the sounds.
             const bool chosen = !options.sound.map.empty() && type == qvAudioStream && !plan.hasVideo();
             if (plan.output.takesOneStream() && !plan.streams.empty() && !chosen) continue;
@@ -57,7 +68,8 @@ void checkKinds(JobPlan& plan, const PlanOptions& options) {
         throw failure(output.kind == OutputKind::wav ? Msg::inputNoSound : Msg::inputNoStreams,
                       {output.name});
     if (output.kind == OutputKind::byInput) output.kind = plan.hasVideo() ? OutputKind::raw : OutputKind::wav;
-    const bool sound = output.kind == OutputKind::wav || output.kind == OutputKind::nothing;
+    const bool sound = output.kind == OutputKind::wav || output.kind == OutputKind::nothing ||
+                       output.kind == OutputKind::module;
     if (sound || plan.hasVideo()) return;
     if (options.noVideo) throw failure(Msg::inputUnwanted, {"--no-video", output.name});
     throw failure(Msg::inputNoPicture, {output.name});
@@ -75,7 +87,7 @@ void checkChannels(const JobPlan& plan, const PlanOptions& options) {
 // What has a file of its own is one, or is numbered as the user says.
 void checkCounts(const JobPlan& plan) {
     const OutputForm& output = plan.output;
-    if (!output.isFiles() || output.kind == OutputKind::avi) return;
+    if (!output.isFiles() || output.isOneFile()) return;
     for (const int type : {qvVideoStream, qvAudioStream}) {
         const int streams = plan.count(type);
         if (streams < 2) continue;
@@ -173,14 +185,17 @@ JobPlan planJob(const PlanOptions& options, const OutputForm& output, std::vecto
     JobPlan plan;
     plan.output = output;
     plan.inputs = std::move(inputs);
+    plan.preset = options.preset;
     checkDamage(plan, options.acceptPartial);
     takeStreams(plan, options, known);
     EffectOptions effects = options.effects;
     effects.pixel = output.pixel;
-    FilterPlanner filters(plan, effects, known ? known->pictures : std::vector<PictureFormat>());
+    PresetPlanner preset(plan, options, effects, known);
+    FilterPlanner filters(plan, effects, preset.pictures());
     if (!known) checkKinds(plan, options);
     if (plan.streams.empty()) throw failure(Msg::segmentNoStreams, {plan.inputs.front().name});
     SoundPlanner sounds(plan, options);  // its map decides which sounds there are
+    preset.takeSounds();
     if (!known) checkFit(plan, options);
     if (!known) warnOfUnused(plan, options);
     planPoints(plan, {options.from, options.to, options.duration});
@@ -191,6 +206,7 @@ JobPlan planJob(const PlanOptions& options, const OutputForm& output, std::vecto
     if (!known) checkEffects(plan, effects);
     filters.plan();
     sounds.planFilters();
+    preset.settle();
     return plan;
 }
 

@@ -24,7 +24,8 @@ struct PlannedStream {
     int type = qvVideoStream;  // or qvAudioStream
     int number = 0;            // among those of its type in the output
     StreamPart part;
-    std::string module;  // encoder of a stored task; empty for the one that writes raw streams
+    std::string module;  // encoder of a stored task or a preset; empty for the one that writes raw streams
+    AnyDict codec;       // what a preset sets it to
     // The format that is written.
     PictureFormat picture;           // of video
     SoundFormat sound;               // of audio
@@ -50,6 +51,7 @@ struct PlannedStream {
 
 struct JobPlan {
     OutputForm output;
+    std::shared_ptr<const OutputPreset> preset;  // that the output is made by; null for none
     std::vector<JobInput> inputs;
     std::vector<PlannedStream> streams;
     FilterFiles filterFiles;

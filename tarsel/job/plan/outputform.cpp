@@ -23,17 +23,36 @@ constexpr KindRow kKinds[] = {
     {"avi", OutputKind::avi},
 };
 
-// "ext" of --format, or of the output's name.
-std::string formatName(const PlanOptions& options) {
-    return extensionOf(options.format.empty() ? options.output : "x." + options.format);
+// What the tool itself writes under an extension.
+std::optional<OutputKind> ownKind(const std::string& extension) {
+    for (const KindRow& row : kKinds)
+        if (extension == row.extension) return row.kind;
+    return rawName(extension) ? std::optional(OutputKind::raw) : std::nullopt;
+}
+
+// A name that means something is not for another format.
+OutputKind kindOf(const PlanOptions& options, const OutputPreset& preset, OutputPlace place) {
+    const auto named = ownKind(formatName(options));
+    const bool avi = named == OutputKind::avi;
+    const auto requireName = [&](bool fits) {
+        if (!fits) throw failure(Msg::presetOutput, {options.output, preset.name()});
+    };
+    if (!preset.isRaw()) {
+        requireName(!named || (avi && preset.muxer().ends_with("avimux")));
+        return OutputKind::module;
+    }
+    requireName(!named || avi == (preset.muxer() == "rawavimux"));
+    if (preset.muxer() == "rawavimux") return OutputKind::avi;
+    if (named) return *named;
+    if (place != OutputPlace::files) return OutputKind::byInput;
+    return preset.has(qvVideoStream) ? OutputKind::raw : OutputKind::wav;
 }
 
 OutputKind kindOf(const PlanOptions& options, OutputPlace place) {
     if (options.kind) return *options.kind;
+    if (options.preset) return kindOf(options, *options.preset, place);
     const std::string extension = formatName(options);
-    for (const KindRow& row : kKinds)
-        if (extension == row.extension) return row.kind;
-    if (rawName(extension)) return OutputKind::raw;
+    if (const auto own = ownKind(extension)) return *own;
     std::vector<std::string> known;
     for (const auto& row : kKinds) known.emplace_back(row.extension);
     for (const auto& row : rawNames()) known.emplace_back(row.extension);
@@ -62,7 +81,7 @@ std::string pixelOf(const PlanOptions& options, OutputKind kind) {
 
 void checkMuxer(const PlanOptions& options, OutputKind kind) {
     const char* const writer = kind == OutputKind::avi ? "rawavimux" : "rawmux";
-    if (!options.kind && !options.muxer.empty() && options.muxer != writer)
+    if (!options.kind && !options.preset && !options.muxer.empty() && options.muxer != writer)
         throw failure(Msg::muxerOther, {options.muxer, options.output, writer});
 }
 
@@ -87,6 +106,12 @@ void takeNumbers(const PlanOptions& options, OutputForm& form) {
 }
 
 }  // namespace
+
+std::string formatName(const PlanOptions& options) {
+    return extensionOf(options.format.empty() ? options.output : "x." + options.format);
+}
+
+bool writesItself(const std::string& extension) { return ownKind(extension) || openName(extension); }
 
 const char* OutputForm::muxer() const {
     if (writesNothing()) return "nullmux";
@@ -114,7 +139,8 @@ OutputForm outputForm(const PlanOptions& options, OutputPlace place) {
     if (place == OutputPlace::nowhere) return form;
     form.kind = kindOf(options, place);
     checkMuxer(options, form.kind);
-    if (form.kind == OutputKind::module) form.muxerModule = options.muxer;
+    if (form.kind == OutputKind::module)
+        form.muxerModule = options.preset ? options.preset->muxer() : options.muxer;
     form.pixel = pixelOf(options, form.kind);
     if (form.takesOneStream()) checkStream(options, form.kind);
     if (form.isFiles()) takeNumbers(options, form);

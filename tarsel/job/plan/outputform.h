@@ -24,6 +24,10 @@ struct OutputForm {
 
     std::string muxerModule;  // of OutputKind::module
 
+    // One file, whatever streams there are.
+    bool isOneFile() const {
+        return kind == OutputKind::avi || (kind == OutputKind::module && muxerModule != "rawmux");
+    }
     bool isFiles() const { return place == OutputPlace::files; }
     bool takesOneStream() const { return place == OutputPlace::stream; }
     bool writesNothing() const { return kind == OutputKind::nothing || place == OutputPlace::nullDevice; }
@@ -31,6 +35,10 @@ struct OutputForm {
     const char* muxer() const;
     std::string extension(bool hasVideo) const;
 };
+
+// "ext" of --format, or of the output's name, and whether the tool writes it without a preset.
+std::string formatName(const PlanOptions& options);
+bool writesItself(const std::string& extension);
 
 // The form of an output that is `place`. Throws Failure for a name or a format that means nothing, or that
 // does not fit the place.

@@ -2,11 +2,14 @@
 // when they were not.
 #pragma once
 
+#include <functional>
+#include <memory>
 #include <optional>
 #include <string>
 #include <vector>
 
 #include "tarsel/picture/effects.h"
+#include "tarsel/presets/outputpreset.h"
 #include "tarsel/sound/soundoptions.h"
 
 enum class OutputKind {
@@ -14,7 +17,7 @@ enum class OutputKind {
     wav,
     pictures,  // a sequence of PNG files
     avi,
-    module,  // what the multiplexer of a stored task writes
+    module,  // what the multiplexer of a stored task or a preset writes
     nothing,
     byInput,  // a stream whose name does not say it: raw pictures, or WAV where there is no picture
 };
@@ -35,4 +38,7 @@ struct PlanOptions {
     bool shortest = false, longest = false;
     bool splitChannels = false;
     bool acceptPartial = false;
+    std::shared_ptr<const OutputPreset> preset;  // what the output is to be; null for none
+    // With --match: fits an encoder to a stream of an input.
+    std::function<void(int type, int input, int stream, QvEncoder& encoder)> fit;
 };

@@ -62,6 +62,7 @@ void JoinPlanner::plan() {
     const std::vector<SegmentWords> all = words();
     for (size_t i = 0; i < all.size(); ++i) add(all[i], i == 0, i + 1 == all.size());
     whole_.output = form_;
+    whole_.preset = options_.preset;
     whole_.streams = join_.streams();
     checkOutput(whole_, options_);
     checkEffects(whole_, options_.effects);

@@ -1,0 +1,119 @@
+#include "tarsel/job/plan/presetplan.h"
+
+#include <string_view>
+#include <utility>
+
+#include "tarsel/presets/ranges.h"
+#include "tarsel/source/source.h"
+#include "tarsel/words/messages.h"
+
+namespace {
+
+QvEncoder& encoderOf(const QvEncodePipe& pipe, const PlannedStream& stream) {
+    return *pipe.encoder(stream.type, stream.number);
+}
+
+// The shape in which the encoder's picture is shown.
+double aspectOf(const QvCodec& encoder, const PictureFormat& format) {
+    try {
+        const Any aspect = encoder.getParam("frameAspect");
+        if (aspect.isFloat() && aspect.asDouble() > 0) return aspect.asDouble();
+    } catch (const QvParamException&) {  // not one of its parameters
+    }
+    return isRawEncoder(encoder) ? static_cast<double>(format.width) / format.height : format.aspect;
+}
+
+void setPicture(QvEncoder& encoder, const PictureFormat& picture) {
+    if (isRawEncoder(encoder)) setChecked(encoder, "type", static_cast<int>(picture.fourcc), "--pixel");
+    for (const auto& [name, value] : {std::pair{"width", picture.width}, std::pair{"height", picture.height}})
+        if (static_cast<QvCodec&>(encoder).setParam(name, value) != QvStatus::ok)
+            throw failure(Msg::frameTooLarge,
+                          {"--size", std::to_string(picture.width) + "x" + std::to_string(picture.height)});
+    setChecked(encoder, "framerate", Any(picture.rate), "--rate");
+}
+
+void setSound(QvEncoder& encoder, const SoundFormat& sound) {
+    setChecked(encoder, "samplerate", sound.samplerate, "--samplerate");
+    setChecked(encoder, "channels", sound.channels, "--channels");
+    setChecked(encoder, "bitsPerSample", sound.bits, "--bits");
+}
+
+}  // namespace
+
+void setFormat(QvEncoder& encoder, const PlannedStream& stream) {
+    stream.isVideo() ? setPicture(encoder, stream.picture) : setSound(encoder, stream.sound);
+}
+
+PresetPlanner::PresetPlanner(JobPlan& plan, const PlanOptions& options, const EffectOptions& effects,
+                             const KnownFormats* known)
+    : plan_(plan), options_(options), effects_(effects), known_(known) {
+    if (known) pictures_ = known->pictures;
+    if (!plan.preset) return;
+    pipe_ = plan.preset->makePipe(plan.output.muxer());
+    bool asks = !pictures_.empty();
+    std::vector<PictureFormat> formats = pictures_;
+    for (PlannedStream& stream : plan.streams) {
+        if (!stream.isVideo()) continue;
+        takeEncoder(stream);
+        if (static_cast<size_t>(stream.number) >= formats.size())
+            formats.push_back(wanted(stream, encoderOf(*pipe_, stream), asks));
+    }
+    if (asks) pictures_ = std::move(formats);
+}
+
+void PresetPlanner::takeSounds() {
+    if (!pipe_) return;
+    for (PlannedStream& stream : plan_.streams) {
+        if (stream.isVideo()) continue;
+        takeEncoder(stream);
+        if (!known_ || static_cast<size_t>(stream.number) >= known_->sounds.size())
+            takeSound(stream, encoderOf(*pipe_, stream));
+    }
+}
+
+void PresetPlanner::takeEncoder(PlannedStream& stream) {
+    QvEncoder& encoder = plan_.preset->addStream(*pipe_, stream.type);
+    stream.module = encoder.name();
+    if (options_.fit) options_.fit(stream.type, stream.part.input, stream.part.stream, encoder);
+}
+
+PictureFormat PresetPlanner::wanted(const PlannedStream& stream, const QvCodec& encoder, bool& asks) const {
+    const bool png = plan_.output.kind == OutputKind::pictures;
+    PictureFormat format = PictureEffects(effects_, stream.picture, png).out();
+    const PresetPicture asked =
+        plan_.preset->picture(encoder, stream.number, static_cast<bool>(options_.fit));
+    if (!asked.any()) return format;
+    asks = true;
+    if (effects_.size.empty() && effects_.fit.empty() && (asked.width || asked.height)) {
+        format.width = asked.width.value_or(format.width);
+        format.height = asked.height.value_or(format.height);
+        format.aspect = aspectOf(encoder, format);
+    }
+    if (effects_.rate.empty() && asked.rate) format.rate = *asked.rate;
+    if (effects_.pixel.empty() && asked.fourcc) format.fourcc = *asked.fourcc;
+    return format;
+}
+
+void PresetPlanner::takeSound(PlannedStream& stream, const QvCodec& encoder) const {
+    const PresetSound asked = plan_.preset->sound(encoder, stream.number, static_cast<bool>(options_.fit));
+    SoundFormat& sound = stream.sound;
+    if (!options_.samplerate && asked.samplerate) sound.samplerate = *asked.samplerate;
+    if (!options_.channels && options_.sound.map.empty() && asked.channels) sound.channels = *asked.channels;
+    if (!options_.bits && asked.bits) sound.bits = *asked.bits;
+}
+
+void PresetPlanner::settle() {
+    if (!pipe_) return;
+    for (PlannedStream& stream : plan_.streams) {
+        QvEncoder& encoder = encoderOf(*pipe_, stream);
+        const QvPreset* const preset = &plan_.preset->preset();
+        if (stream.isVideo())
+            checkPictureRanges(preset, encoder, stream.picture.width, stream.picture.height,
+                               stream.picture.rate);
+        else
+            checkSoundRanges(preset, encoder, stream.sound.samplerate, stream.sound.channels,
+                             stream.sound.bits);
+        setFormat(encoder, stream);
+        encoder.store(stream.codec);
+    }
+}

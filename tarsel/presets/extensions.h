@@ -1,0 +1,16 @@
+// What an output's name means beyond the formats of the tool itself: the presets of an extension.
+#pragma once
+
+#include <span>
+#include <string_view>
+
+struct PresetExtension {
+    static constexpr int most = 3;
+    std::string_view extension;  // without the dot, in small letters
+    const char* muxer;
+    const char* symbols[most];  // of the presets, the first one that is installed is taken; null for none
+};
+
+std::span<const PresetExtension> presetExtensions();
+// The row of an extension, or null.
+const PresetExtension* presetExtension(std::string_view extension);

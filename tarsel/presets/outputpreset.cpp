@@ -1,0 +1,152 @@
+#include "tarsel/presets/outputpreset.h"
+
+#include <string_view>
+
+#include "tarsel/presets/extensions.h"
+#include "tarsel/presets/presetsearch.h"
+#include "tarsel/words/messages.h"
+
+namespace {
+
+int encoderKind(int type) {
+    return type == qvVideoStream ? QvModuleType::videoEncoder : QvModuleType::audioEncoder;
+}
+
+// Invalid for a parameter that the encoder does not have.
+Any ask(const QvCodec& encoder, const char* name) {
+    try {
+        return encoder.getParam(name);
+    } catch (const QvParamException&) {
+        return Any();
+    }
+}
+
+std::optional<int> positive(const Any& value) {
+    return value.isInt() && value.toInt32() > 0 ? std::optional(value.toInt32()) : std::nullopt;
+}
+
+std::string defaultMuxer(const QvPreset& preset) {
+    const Any muxer = preset.defaultMuxer();
+    return muxer.isString() ? muxer.asString() : "";
+}
+
+// The presets of an extension, none of which is installed.
+Failure missing(const PresetExtension& row) {
+    return failure(Msg::outputNoPreset, {"x." + std::string(row.extension)});
+}
+
+const PresetExtension* rowOf(const QvPreset& preset, const std::string& extension) {
+    const PresetExtension* const row = presetExtension(extension);
+    return row && preset.muxerAllowed(row->muxer) ? row : nullptr;
+}
+
+std::shared_ptr<const OutputPreset> byExtension(const PresetExtension& row, const std::string& muxer) {
+    const QvPresetMgr& catalogue = *qvPresetMgr();
+    for (const char* symbol : row.symbols) {
+        const int index = symbol ? catalogue.findByProfile(qvSymToProfile(symbol)) : -1;
+        if (index < 0) continue;
+        const QvPreset preset = catalogue.builtinPreset(index);
+        if (preset.muxerAllowed(row.muxer))
+            return std::make_shared<OutputPreset>(preset, muxer.empty() ? row.muxer : muxer);
+    }
+    throw missing(row);
+}
+
+}  // namespace
+
+bool isRawEncoderName(std::string_view name) { return name == "rawvenc" || name == "rawaenc"; }
+bool isRawEncoder(const QvCodec& encoder) { return isRawEncoderName(encoder.name()); }
+
+OutputPreset::OutputPreset(const QvPreset& preset, const std::string& muxer)
+    : preset_(preset), muxer_(muxer.empty() ? defaultMuxer(preset) : muxer) {
+    if (!preset_.isValid())
+        throw failure(Msg::presetInvalid, {name(), preset_.error().toString().asString("")});
+    if (!muxer.empty() && !preset_.muxerAllowed(muxer.c_str()))
+        throw failure(Msg::presetMuxer, {muxer, name(), namesOf(preset_.muxers())});
+}
+
+bool OutputPreset::has(int type) const {
+    if (preset_.isCustom() && preset_.get("streams").isVector())
+        return !preset_.streamParams(type, 0, nullptr).empty();
+    return !preset_.getCompatible(muxer_.c_str(), encoderKind(type)).empty();
+}
+
+bool OutputPreset::isRaw() const {
+    return preset_.videoCodecs().at(0) == "rawvenc" && (muxer_ == "rawmux" || muxer_ == "rawavimux");
+}
+
+std::unique_ptr<QvEncodePipe> OutputPreset::makePipe(const char* muxer) const {
+    std::unique_ptr<QvEncodePipe> pipe(QvEncodePipe::create());
+    if (!pipe) throw failure(Msg::outputNoModule, {name()});
+    if (pipe->applyPreset(preset_, 0) != QvStatus::ok)
+        throw failure(Msg::presetInvalid, {name(), pipe->errorDesc()});
+    pipe->clearStreams();
+    const QvMuxer* const present = pipe->getMuxer();
+    if (!(present && std::string_view(present->name()) == muxer) && pipe->setMuxer(muxer) != QvStatus::ok)
+        throw failure(Msg::muxerUnusable, {muxer, pipe->errorDesc()});
+    pipe->clearStreams();
+    return pipe;
+}
+
+QvEncoder& OutputPreset::addStream(QvEncodePipe& pipe, int type) const {
+    const int number = pipe.addStream(type, Any());
+    if (number < 0)
+        throw failure(Msg::presetNoStream,
+                      {name(), type == qvVideoStream ? "picture" : "sound", pipe.errorDesc()});
+    return *pipe.encoder(type, number);
+}
+
+// A raw encoder takes what comes, so its defaults are nobody's wish.
+bool OutputPreset::says(const QvCodec& encoder, int type, int number, const char* name, const char* range,
+                        bool fitted) const {
+    if (fitted && !ask(encoder, range).isValid()) return false;
+    if (fitted || !isRawEncoder(encoder)) return true;
+    return storedCodec(type, number).isSet(name);
+}
+
+AnyDict OutputPreset::storedCodec(int type, int number) const {
+    if (!preset_.isCustom()) return AnyDict();
+    const AnyDict stream = preset_.streamParams(type, number, nullptr);
+    const AnyDict codec = stream.getDict("codec", AnyDict());
+    return codec.getDict("settingsDict", codec);
+}
+
+PresetPicture OutputPreset::picture(const QvCodec& encoder, int number, bool fitted) const {
+    const auto asked = [&](const char* name, const char* range) {
+        return says(encoder, qvVideoStream, number, name, range, fitted) ? ask(encoder, name) : Any();
+    };
+    PresetPicture picture;
+    picture.width = positive(asked("width", "sizeRange"));
+    picture.height = positive(asked("height", "sizeRange"));
+    if (const Any rate = asked("framerate", "framerateRange"); rate.isFramerate())
+        picture.rate = rate.asFramerate();
+    // Only the raw encoder takes any format, and only a preset that names one asks for it.
+    const bool raw = isRawEncoder(encoder);
+    const Any format =
+        raw ? says(encoder, qvVideoStream, number, "type", "", false) ? ask(encoder, "type") : Any()
+            : ask(encoder, "FOURCC");
+    if (format.isInt() && qvPixelFormat(static_cast<unsigned>(format.toInt32())))
+        picture.fourcc = static_cast<unsigned>(format.toInt32());
+    return picture;
+}
+
+PresetSound OutputPreset::sound(const QvCodec& encoder, int number, bool fitted) const {
+    const auto asked = [&](const char* name, const char* range) {
+        return says(encoder, qvAudioStream, number, name, range, fitted) ? positive(ask(encoder, name))
+                                                                         : std::nullopt;
+    };
+    return {asked("samplerate", "samplerateRange"), asked("channels", "channelsRange"),
+            asked("bitsPerSample", "bitsPerSampleRange")};
+}
+
+std::shared_ptr<const OutputPreset> outputPreset(const std::string& name, const std::string& extension,
+                                                 const std::string& muxer) {
+    if (name.empty()) {
+        const PresetExtension* const row = presetExtension(extension);
+        return row ? byExtension(*row, muxer) : nullptr;
+    }
+    const QvPreset preset = findPreset(name);
+    const PresetExtension* const row =
+        muxer.empty() && preset.isBuiltin() ? rowOf(preset, extension) : nullptr;
+    return std::make_shared<OutputPreset>(preset, row ? row->muxer : muxer);
+}

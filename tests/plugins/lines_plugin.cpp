@@ -1,0 +1,80 @@
+// A plug-in with a video encoder under a name that presets wait for. It writes a line of text for each
+// picture, and takes few sizes and rates.
+#include <string>
+
+#include "core/encode/qvencoder.h"
+#include "core/engine/modules/qvmodule.h"
+#include "core/engine/modules/qvplugin.h"
+#include "core/measure/fourcc.h"
+#include "core/measure/qvframerate.h"
+#include "core/media/qvbuffer.h"
+#include "core/stream/qvbufstrm.h"
+
+namespace {
+
+class LineEncoder : public QvVideoEncoder {
+  public:
+    using QvVideoEncoder::getParam;
+
+    LineEncoder() {
+        values_ = AnyDict("width", 320, "height", 240, "framerate", QvFramerate::f25p(), "profile", 0,
+                          "FOURCC", static_cast<int>(QvFourcc::I420));
+        ranges_ = AnyDict("sizeRange", AnyDict("wmin", 16, "wmax", 720, "hmin", 16, "hmax", 576),
+                          "framerateRange", AnyVector(Any(QvFramerate::f25p()), Any(QvFramerate::f50p())));
+        ranges_.set("inFOURCC", AnyVector(Any(static_cast<int>(QvFourcc::I420))));
+        ranges_.set("extension", "h264");
+    }
+    int setParam(const char* name, const Any& value) override {
+        if (!values_.isSet(name)) return QvVideoEncoder::setParam(name, value);
+        values_.set(name, value);
+        return QvStatus::ok;
+    }
+    void getParam(const char* name, Any& value) const override {
+        if (values_.isSet(name))
+            value = values_.get(name);
+        else if (ranges_.isSet(name))
+            value = ranges_.get(name);
+        else
+            QvVideoEncoder::getParam(name, value);
+    }
+    void store(AnyDict& state) const override {
+        state = values_;
+        state.set("name", name());
+    }
+    int restore(const AnyDict& state) override {
+        for (const auto [key, value] : state)
+            if (values_.isSet(key)) values_.set(key, *value);
+        return QvStatus::ok;
+    }
+    int open() override { return QvStatus::ok; }
+    int close() override { return QvStatus::ok; }
+    int writeFrame(QvFrame* frame) override {
+        std::string line = std::to_string(frame->width()) + "x" + std::to_string(frame->height()) + "\n";
+        auto* const out = outStream()->input();
+        const auto size = static_cast<unsigned>(line.size());
+        return out->copybytes(out, reinterpret_cast<unsigned char*>(line.data()), size) == size
+                   ? QvStatus::ok
+                   : setError(QvStatus::failed, "The output takes no more");
+    }
+    QvFrame* lastFrame() override { return nullptr; }
+
+  private:
+    AnyDict values_, ranges_;
+};
+
+struct Module : QvModule {
+    Module() : QvModule(QvModuleType::videoEncoder, "h264venc", "of a test", "Lines") {}
+    QvCodec* create() override { return _setAttrs(new LineEncoder); }
+};
+
+}  // namespace
+
+extern "C" {
+QV_API unsigned qv_plugin_abi = qvPluginAbi;
+}
+
+extern "C" QV_API QvPlugin* plugin_init() {
+    static QvPlugin plugin("lines", "An encoder that presets wait for");
+    if (plugin.nrModules() == 0) plugin.addModule(new Module);
+    return &plugin;
+}
