@@ -1,0 +1,36 @@
+#include "core/batch/failuretext_p.h"
+
+#include <algorithm>
+#include <cstdio>
+#include <exception>
+#include <new>
+
+#include "core/arch/qvexception.h"
+#include "core/engine/status.h"
+
+namespace {
+
+FailureText make(int code, const char* text) {
+    FailureText made{code, ""};
+    std::snprintf(made.text, sizeof made.text, "%s", text && *text ? text : "unknown failure");
+    std::replace(std::begin(made.text), std::end(made.text), '\n', ' ');
+    return made;
+}
+
+}  // namespace
+
+FailureText qvCurrentFailure() noexcept {
+    try {
+        throw;
+    } catch (const QvMemoryFailure& failure) {
+        return make(QvStatus::outOfMemory, failure.what());
+    } catch (const QvException& failure) {
+        return make(QvStatus::failed, failure.what());
+    } catch (const std::bad_alloc&) {
+        return make(QvStatus::outOfMemory, "out of memory");
+    } catch (const std::exception& failure) {
+        return make(QvStatus::failed, failure.what());
+    } catch (...) {
+        return make(QvStatus::failed, "unknown exception");
+    }
+}
