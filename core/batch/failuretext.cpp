@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cstdio>
+#include <cstring>
 #include <exception>
 #include <new>
 
@@ -17,6 +18,13 @@ FailureText make(int code, const char* text) {
     return made;
 }
 
+// The words of an assertion without the place in the source, which is in the log; where it has no words, the
+// place is all there is.
+const char* wordsOf(const QvAssertFailure& failure) {
+    const char* const words = std::strstr(failure.what(), ": \n");
+    return words && words[3] ? words + 3 : failure.what();
+}
+
 }  // namespace
 
 FailureText qvCurrentFailure() noexcept {
@@ -24,6 +32,8 @@ FailureText qvCurrentFailure() noexcept {
         throw;
     } catch (const QvMemoryFailure& failure) {
         return make(QvStatus::outOfMemory, failure.what());
+    } catch (const QvAssertFailure& failure) {
+        return make(QvStatus::failed, wordsOf(failure));
     } catch (const QvException& failure) {
         return make(QvStatus::failed, failure.what());
     } catch (const std::bad_alloc&) {
