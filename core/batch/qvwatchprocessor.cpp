@@ -46,6 +46,17 @@ void rewind(QvDecodePipe& decoder) {
         if (decoder.isSelected(qvAudioStream, k)) decoder.seekToSample(0, k);
 }
 
+// Why an output would cost something that is needed, or null.
+const char* unusable(const Any& output, const Any& input, const std::vector<std::string>& others) {
+    if (QvFile::isSameFile(output, input)) return "is the input";
+    if (std::find(others.begin(), others.end(), qv_os_name(output)) != others.end())
+        return "is the output of another target";
+    // It would be found there as a new input, and so would what is made of that.
+    if (QvFile::isSameFile(QvFile::getPath(output), QvFile::getPath(input)))
+        return "would be in the watched folder";
+    return nullptr;
+}
+
 }  // namespace
 
 int QvWatchProcessor::process(QvWatchFolderInput& input, const QvWatchTask& task, int) {
@@ -104,9 +115,8 @@ int QvWatchProcessor::_transcodeTarget(QvDecodePipe& decoder, const QvWatchTask&
     const std::string name = qv_os_name(output);
     qv_log()->info("   ->%s", name.c_str());
     qv_log()->info("    preset:");
-    if (QvFile::isSameFile(output, inputFile) ||
-        std::find(outputs.begin(), outputs.end(), name) != outputs.end()) {
-        qv_log()->error("    %s is the input, or the output of another target", name.c_str());
+    if (const char* reason = unusable(output, inputFile, outputs)) {
+        qv_log()->error("    %s %s", name.c_str(), reason);
         return QvStatus::invalidArgument;
     }
     outputs.push_back(name);

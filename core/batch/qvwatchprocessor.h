@@ -22,8 +22,8 @@ class QV_API QvWatchProcessor {
 
     // Goes on until the input has no more files. `flags` is not used. 0 if every target of every file was
     // made; -1 if one failed, or could not be begun as its folder can't be made. A target whose output would
-    // be the input itself, or that of another target of the file, fails; an older file of that name is
-    // replaced.
+    // be the input itself, in the watched folder, or that of another target of the file, fails; an older file
+    // of that name is replaced.
     int process(QvWatchFolderInput& input, const QvWatchTask& task, int flags = 0);
 
   protected:
