@@ -151,20 +151,24 @@ void BatchTaskRun::transcode(QvBatchTask& task, const Segments& segments) {
         message = failure.text;
     }
     const int code = resultCode(transcoder, result);
+    if (code == QvBatchProcessCb::taskAborted) message.clear();
     batch_.report.segmentFinished(index_, segments.last, code, message.c_str());
     finish(code, message.c_str());
 }
 
 int BatchTaskRun::resultCode(const BatchTranscoder& transcoder, int result) {
-    // A warning stays in the transcoder of a run that went well.
-    if (result == QvStatus::warning || (result == QvStatus::ok && transcoder.errorCode() != QvStatus::ok)) {
-        qv_dbg()->warning("%s", transcoder.errorDesc());
-    } else if (result != QvStatus::ok && !transcoder.stoppedMeasuring()) {
+    // A stop also ends what can take long while a run is opened: sound that is read ahead, the wait for the
+    // reader of the output. That the run could not be opened then is no failure.
+    const bool stopped = batch_.control.stopping();
+    if (result == QvStatus::ok || result == QvStatus::warning) {
+        // The transcoder of a run that went well keeps a warning.
+        if (transcoder.errorCode() != QvStatus::ok) qv_dbg()->warning("%s", transcoder.errorDesc());
+    } else if (!stopped || transcoder.worked()) {
         qv_dbg()->error("[BatchProcessor] Task #%d: transcoding failed.", index_);
         if (transcoder.errorCode() != QvStatus::ok) batch_.error.copy(result, transcoder.errorDesc());
         return QvBatchProcessCb::taskFailed;
     }
-    if (batch_.control.stopping()) {
+    if (stopped) {
         qv_dbg()->info("[BatchProcessor] Task #%d: transcoding aborted.", index_);
         return QvBatchProcessCb::taskAborted;
     }

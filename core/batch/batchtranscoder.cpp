@@ -22,9 +22,8 @@ int BatchTranscoder::cbProgress(double part) {
     return 0;
 }
 
-void BatchTranscoder::cbMeasure(double) { stoppedMeasuring_ = control_.stopping(); }
-
 int BatchTranscoder::cbProcess() {
+    worked_ = true;
     control_.waitWhilePaused([this](bool paused) {
         report_.tell([paused](QvBatchProcessCb& callback) { callback.batchPaused(paused); });
     });

@@ -16,10 +16,9 @@ class BatchTranscoder : public QvTranscoder {
 
     int cbProgress(double part) override;
     int cbProcess() override;
-    void cbMeasure(double part) override;
 
-    // A stop came while sound was read ahead: that the run then could not be opened is no failure.
-    bool stoppedMeasuring() const { return stoppedMeasuring_; }
+    // Whether the run came to a first round of work, or ended while it was opened.
+    bool worked() const { return worked_; }
 
   private:
     void followSegment();
@@ -28,5 +27,5 @@ class BatchTranscoder : public QvTranscoder {
     BatchControl& control_;
     BatchReport& report_;
     int openSegment_ = 0;  // among those that are open, as last read
-    bool stoppedMeasuring_ = false;
+    bool worked_ = false;
 };

@@ -1,5 +1,7 @@
 #include "core/batch/qvbatchprocessor.h"
 
+#include <sys/stat.h>
+
 #include <set>
 #include <thread>
 
@@ -220,6 +222,50 @@ TEST_F(QvBatchProcessorTest, StopEndsATaskAndTheRun) {
     notes_.hook = nullptr;
     runAll();
     EXPECT_EQ(notes_.count(":0 end"), 1) << "a stop is not for the next run";
+}
+
+// Nobody reads the pipe that is the output.
+TEST_F(QvBatchProcessorTest, StopEndsTheWaitForAReader) {
+    const std::string pipe = folder_.file("out0.raw");
+    ASSERT_EQ(mkfifo(pipe.c_str(), 0600), 0);
+    const std::unique_ptr<QvEncodePipe> output(QvEncodePipe::create());
+    output->clearStreams();
+    output->addAudioStream("rawaenc");
+    ASSERT_EQ(output->setParam("muxer/exactName", 1), 0);
+    AnyDict encoder;
+    output->store(encoder);
+    QvTaskState stuck = task("out0.raw", {wav_});
+    stuck.set("encoder", encoder);
+    list_.append(stuck);
+    list_.append(good(1));
+    processor_.init(list_);
+    ASSERT_EQ(processor_.start(false, &notes_), 0);
+    notes_.waitFor("seg0.0");
+    EXPECT_EQ(processor_.stop(), 0);
+    EXPECT_EQ(notes_.take(), "begin task0 init0.0:0 seg0.0 segdone0.0:2 done0:2 end");
+    EXPECT_EQ(message(0), "");
+}
+
+TEST_F(QvBatchProcessorTest, LongVideosReportEveryHundredFrames) {
+    const auto reports = [this](int frames, double to) {
+        const AnyDict file = film("film.yuv", frames, 0, QvFramerate::f25p(), width, height);
+        QvTaskState one;
+        one.set("encoder", output(0));
+        one.setOutputFilename(folder_.file("out0.x").c_str());
+        one.set("streams", AnyVector(AnyDict("type", 1)));
+        one.set("segments", AnyVector());
+        one.addSegment(AnyVector(source(1, file, cut(0, to))), AnyVector(file));
+        QvBatchList list;
+        list.append(one);
+        processor_.init(list);
+        notes_.progressed.clear();
+        EXPECT_EQ(processor_.start(true, &notes_), 0);
+        return static_cast<int>(notes_.progressed.size());
+    };
+    EXPECT_EQ(reports(1200, 48), 12);
+    EXPECT_DOUBLE_EQ(notes_.progressed.at(3), 0.25);
+    EXPECT_EQ(reports(1000, 40), 100);
+    EXPECT_EQ(reports(1200, 16), 100) << "only the part that is taken counts";
 }
 
 TEST_F(QvBatchProcessorTest, APauseWithinATaskHoldsIt) {
