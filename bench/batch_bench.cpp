@@ -1,4 +1,5 @@
-// Tasks of several segments: how long they take to open, and what a join costs beside a plain job.
+// Tasks of several segments: how long they take to open, and what a join costs beside a plain job. Lists of
+// many tasks: what reading, writing and changing them costs beside the XML alone.
 #include <cstdio>
 #include <cstring>
 #include <fstream>
@@ -6,6 +7,7 @@
 #include <string>
 
 #include "bench/ratio.h"
+#include "core/batch/qvbatchlist.h"
 #include "core/decode/qvdecoder.h"
 #include "core/document/xmldom.h"
 #include "core/encode/qvencodepipe.h"
@@ -119,6 +121,41 @@ double seconds(Action action) {
     return qvBenchSeconds(QvBenchClock::thread) - before;
 }
 
+// A list of tasks of a few segments each.
+void measureLists(const Material& material) {
+    constexpr int tasks = 10000;
+    QvRatioBench bench("lists of 10,000 tasks", QvBenchClock::thread);
+    const QvTaskState one = taskOf(material, 2, 4);
+    QvBatchList list;
+    for (int i = 0; i < tasks; ++i) {
+        QvTaskState task = one;
+        task.setOutputFilename(Any((std::to_string(i) + ".avi").c_str()));
+        list.append(task);
+    }
+    const std::string file = material.folder.file("list.xml"), plain = material.folder.file("plain.xml");
+    AnyDict dict;
+    list.store(dict);
+    bench.compare(
+        "save : the XML alone", 1.1, [&] { list.save(file.c_str()); },
+        [&] { XmlParser::storeDict(plain.c_str(), dict, "BatchList", "2.0"); }, 3);
+    QvBatchList read;
+    bench.compare(
+        "load : the XML alone", 1.1, [&] { read.load(file.c_str()); },
+        [&] {
+            Any name, version;
+            XmlParser::restoreDict(file.c_str(), dict, name, version);
+        },
+        3);
+    QvRatioBench::tell("save", seconds([&] { list.save(file.c_str()); }), "s");
+    QvRatioBench::tell("load", seconds([&] { read.load(file.c_str()); }), "s");
+    const Any last((std::to_string(tasks - 1) + ".avi").c_str());
+    const double change = seconds([&] {
+        read.moveTask(0, tasks - 1);
+        read.setTaskEnabled(0, read.findByOutputFile(last) >= 0 && !read.hasOutputFile("new.avi"));
+    });
+    QvRatioBench::tell("a name looked for, a task moved and changed", change * 1000, "ms");
+}
+
 }  // namespace
 
 int main() {
@@ -148,5 +185,6 @@ int main() {
             "a join of 8 segments : the same as a plain job", 1.05, [&] { joined.run(); },
             [&] { plain.run(); });
     }
+    measureLists(material);
     cleanup_wrapper();
 }

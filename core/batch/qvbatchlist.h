@@ -31,7 +31,7 @@ class QV_API QvBatchList : public AnyVector {
     bool moveTaskUp(int index) { return moveTask(index, -1); }
     bool moveTaskDown(int index) { return moveTask(index, 1); }
 
-    // Whether a task writes to that name, leaving out task `except` (-1: none).
+    // Whether a task writes to that name (of either width), leaving out task `except` (-1: none).
     bool hasOutputFile(const Any& name, int except = -1) const;
     int findByOutputFile(const Any& name) const;  // the last one that writes to that name, or -1
 
@@ -45,11 +45,14 @@ class QV_API QvBatchList : public AnyVector {
     void store(AnyDict& dict) const;   // under "taskList"
     int restore(const AnyDict& dict);  // -1, and nothing changes, without a Vector "taskList"
 
-    // Writes an XML document of type "BatchList", version 2.0: 0, or the writer's code with a line in the
-    // log. The list itself goes through the document's dictionary and back, so that it is not copied; it is
-    // as before also when this fails or throws.
+    // Writes an XML document of type "BatchList", version 2.0: 0, or -1 with a line in the log. A file that
+    // exists is replaced in one step, and stays as it is when this fails. The list itself goes through the
+    // document's dictionary and back, so that it is not copied; it is as before also when this fails or
+    // throws.
     int save(const Any& file);
-    // 0; -9 if the file can't be read; -1 if it holds no list, or one of the form before this one. The list
-    // changes only on success. Encoders that are not installed give way to those that can stand in for them.
+    // 0; -9 if the file can't be read; -1 if it holds no list, a list with an element that is no dictionary,
+    // or one of the form before this one. The list changes only on success. What a task holds is not looked
+    // at: QvBatchProcessor reports a damaged one as failed. Encoders that are not installed give way to those
+    // that can stand in for them.
     int load(const Any& file);
 };

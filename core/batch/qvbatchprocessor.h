@@ -7,8 +7,12 @@
 //     ...
 //     processor.stop();                   // returns when it has ended
 //
-// start, stop, pause, unpause and the queries may be called from any thread but that of the callbacks (stop
-// there would wait for itself); the queries also from there.
+// stop, pause, unpause and the queries may be called from any thread, init and start from any but that of the
+// callbacks.
+//
+// Tasks may come from anywhere: one that is damaged, or is no task at all, is a task that failed, with a text
+// that says at which place: "streams/2/type: it is no type of stream". So is one in which the engine fails an
+// assertion or finds no memory.
 #pragma once
 
 #include <memory>
@@ -16,7 +20,9 @@
 #include "core/arch/api.h"
 #include "core/batch/qvbatchlist.h"
 
-// All calls come from the thread that runs the tasks. Results are not used.
+// All calls come from the thread that runs the tasks. Results are not used. What a call throws ends the run
+// as stop() does, and is the processor's error; the task that is under way and the run still get their last
+// call.
 class QV_API QvBatchProcessCb {
   public:
     enum TaskCode { taskDone = 0, nothingToDo = 1, taskAborted = 2, taskFailed = -1 };
@@ -30,12 +36,14 @@ class QV_API QvBatchProcessCb {
     virtual int batchStarted() { return 0; }
     virtual int batchFinished() { return 0; }
     virtual int taskStarted(int task);
-    // Once for each task that was started. `info` may hold "msg", a text.
+    // Once for each task that was started. `info` may hold "msg", a text: why it failed, or with `taskDone` a
+    // warning.
     virtual int taskFinished(int task, int code, const AnyDict& info);
     virtual int taskSkipped(int task);  // it is disabled
     // After a task was restored, for each of its segments.
     virtual int segmentInitStatus(int task, int segment, int status);
     virtual int segmentStarted(int task, int segment);
+    // At the end of a task for the last of its open segments, also when the run ended before it.
     virtual int segmentFinished(int task, int segment, int code, const AnyDict& info);
     virtual int progress(int task, int segment, const AnyDict& info);  // "percent", 0.0 to 1.0 of the task
     virtual int batchPaused(bool paused);                              // a pause took effect, or has ended
@@ -55,13 +63,14 @@ class QV_API QvBatchProcessor {
     // (assertion) and the result says whether the thread began. An assertion while running.
     virtual int start(bool synchronous, QvBatchProcessCb* callback);
     // Ends the run after the round of work that is under way; the task gets QvBatchProcessCb::taskAborted.
-    // Returns when the run has ended, unless it is synchronous.
+    // Returns when the run has ended, batchFinished() included; at once if the run is synchronous, and in a
+    // callback.
     virtual int stop();
     // Take effect within a task, at its next round of work, or between two tasks: the task that was due then
     // is left out. Assertions in a synchronous run.
     virtual int pause();
     virtual int unpause();
-    // What the worker runs. 0.
+    // What start() runs: 0, or -1 if a callback threw. On its own it is a synchronous run without callbacks.
     virtual int run();
 
     void setSmartRender(bool on);

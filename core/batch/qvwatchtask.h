@@ -1,6 +1,7 @@
 // What is to be made of each file of a watch folder: one preset for each target. A preset's "__target__" is a
-// dictionary: "outputFolder", "presetSubfolder" (true: a folder of the preset's name below it) and optionally
-// "pal" (Int32: 1 or 0 sets the television standard of presets that leave it open).
+// dictionary: "outputFolder", "presetSubfolder" (true: a folder of the preset's name below it, with "_" in
+// the place of separators) and optionally "pal" (Int32: 1 or 0 sets the television standard of presets that
+// leave it open).
 #pragma once
 
 #include "core/arch/api.h"

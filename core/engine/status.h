@@ -18,6 +18,7 @@ constexpr int invalidArgument = -12;
 constexpr int invalidStructure = -13;
 constexpr int noSegment = -15;     // no input segment open
 constexpr int warning = -16;       // the run goes on
+constexpr int notCreated = -17;    // a part of a run could not be made
 constexpr int illegalState = -18;  // illegal state, or not opened
 constexpr int needsInput = -19;    // the pipe needs input
 constexpr int notEnoughViews = -20;

@@ -1,0 +1,25 @@
+// The last failure of a batch processor: code and text, set by the thread that runs and asked for by any.
+#pragma once
+
+#include <cstdarg>
+#include <mutex>
+#include <string>
+
+#include "core/arch/api.h"
+
+class BatchError {
+  public:
+    static constexpr int maxLength = 511;
+
+    // At most maxLength characters, and a line in the debug log.
+    void set(int code, const char* format, va_list args) QV_PRINTF(3, 0);
+    void set(int code, const char* format, ...) QV_PRINTF(3, 4);
+    void copy(int code, const char* text);  // of a failure that is in the log already
+    int code() const;
+    std::string text() const;
+
+  private:
+    mutable std::mutex lock_;
+    int code_ = 0;
+    char text_[maxLength + 1] = "";
+};

@@ -1,0 +1,40 @@
+#include "core/batch/batchreport_p.h"
+
+#include <new>
+
+#include "core/arch/qvexception.h"
+#include "core/batch/batchcontrol_p.h"
+#include "core/batch/batcherror_p.h"
+#include "core/batch/failuretext_p.h"
+
+namespace {
+
+// Empty where there is no message, or no memory for one.
+AnyDict infoOf(const char* message) {
+    AnyDict info;
+    try {
+        if (message && *message) info.set("msg", Any(message));
+    } catch (const std::bad_alloc&) {
+        info.clear();
+    } catch (const QvMemoryFailure&) {
+        info.clear();
+    }
+    return info;
+}
+
+}  // namespace
+
+void BatchReport::taskFinished(int task, int code, const char* message) {
+    tell([&](QvBatchProcessCb& callback) { callback.taskFinished(task, code, infoOf(message)); });
+}
+
+void BatchReport::segmentFinished(int task, int segment, int code, const char* message) {
+    tell([&](QvBatchProcessCb& callback) { callback.segmentFinished(task, segment, code, infoOf(message)); });
+}
+
+void BatchReport::breakOff() {
+    const FailureText failure = qvCurrentFailure();
+    if (!broken_) error_.set(failure.code, "A callback failed: %s", failure.text);
+    broken_ = true;
+    control_.requestStop();
+}

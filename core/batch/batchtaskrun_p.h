@@ -1,0 +1,45 @@
+// One task of a batch, from its stored state to its end.
+#pragma once
+
+#include "core/transcode/task/qvtaskstate.h"
+#include "core/value/any.h"
+
+class BatchControl;
+class BatchError;
+class BatchReport;
+class BatchTranscoder;
+class QvBatchTask;
+
+struct BatchContext {
+    BatchControl& control;
+    BatchError& error;
+    BatchReport& report;
+    int options;  // bits of QvBatchTask
+    bool smartRender;
+};
+
+class BatchTaskRun {
+  public:
+    BatchTaskRun(BatchContext& batch, int index) : batch_(batch), index_(index) {}
+
+    // 0 also for a task that was skipped, and for one whose run failed: only taskFinished tells. Otherwise
+    // why it could not be begun. Does not throw.
+    int run(const Any& stored);
+
+  private:
+    struct Segments {
+        int open = 0, failed = 0, first = -1, last = -1;
+    };
+
+    int restoreAndRun(const Any& stored);
+    int refuse(int code, const char* text);
+    Segments reportSegments(const QvBatchTask& task);
+    int nothingOpen(const Segments& segments);
+    void transcode(QvBatchTask& task, const Segments& segments);
+    int resultCode(const BatchTranscoder& transcoder, int result);
+    void finish(int code, const char* message);
+
+    BatchContext& batch_;
+    const int index_;
+    bool finished_ = false;
+};

@@ -1,0 +1,111 @@
+// Stored tasks over real files, and a callback that writes down what a batch reports.
+#pragma once
+
+#include <atomic>
+#include <condition_variable>
+#include <functional>
+#include <mutex>
+#include <stdexcept>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "core/batch/qvbatchprocessor.h"
+#include "tests/core/transcode/batch/joinedtask.h"
+
+// What is reported, in order, as one line of words; progress is not in it. `hook` is called with each of
+// these, and with "progress", on the thread that reports.
+class BatchNotes : public QvBatchProcessCb {
+  public:
+    std::string all() const {
+        const std::lock_guard guard(lock_);
+        return all_;
+    }
+    std::string take() {
+        const std::lock_guard guard(lock_);
+        return std::exchange(all_, "");
+    }
+    void waitFor(const std::string& text) {
+        std::unique_lock guard(lock_);
+        changed_.wait(guard, [&] { return all_.find(text) != std::string::npos; });
+    }
+    int count(const std::string& text) const {
+        const std::string notes = all();
+        int found = 0;
+        for (std::size_t at = notes.find(text); at != std::string::npos; at = notes.find(text, at + 1))
+            ++found;
+        return found;
+    }
+
+    std::function<void(const std::string&)> hook;
+    std::vector<std::string> messages;  // the "msg" of tasks that have ended
+    std::vector<double> progressed;
+
+    int batchStarted() override { return note("begin"); }
+    int batchFinished() override { return note("end"); }
+    int taskStarted(int task) override { return note("task" + std::to_string(task)); }
+    int taskFinished(int task, int code, const AnyDict& info) override {
+        messages.push_back(info.getString("msg", ""));
+        return note("done" + std::to_string(task) + ":" + std::to_string(code));
+    }
+    int taskSkipped(int task) override { return note("skipped" + std::to_string(task)); }
+    int segmentInitStatus(int task, int segment, int status) override {
+        return note("init" + place(task, segment) + ":" + std::to_string(status));
+    }
+    int segmentStarted(int task, int segment) override { return note("seg" + place(task, segment)); }
+    int segmentFinished(int task, int segment, int code, const AnyDict&) override {
+        return note("segdone" + place(task, segment) + ":" + std::to_string(code));
+    }
+    int progress(int, int, const AnyDict& info) override {
+        progressed.push_back(info.getDouble("percent", -1));
+        if (hook) hook("progress");
+        return 0;
+    }
+    int batchPaused(bool paused) override { return note(paused ? "paused" : "resumed"); }
+
+  private:
+    static std::string place(int task, int segment) {
+        return std::to_string(task) + "." + std::to_string(segment);
+    }
+    int note(const std::string& text) {
+        {
+            const std::lock_guard guard(lock_);
+            all_ += (all_.empty() ? "" : " ") + text;
+            changed_.notify_all();
+        }
+        if (hook) hook(text);
+        return 0;
+    }
+
+    mutable std::mutex lock_;
+    std::condition_variable changed_;
+    std::string all_;
+};
+
+class BatchTest : public JoinedTask {
+  protected:
+    // Sound alone, each file a segment of it.
+    QvTaskState task(const std::string& out, const std::vector<AnyDict>& files) const {
+        QvTaskState made;
+        made.set("__class__", "TranscodeTask");
+        made.set("encoder", output(1, QvFramerate(0.0)));
+        made.setOutputFilename(folder_.file(out).c_str());
+        made.set("streams", AnyVector(AnyDict("type", 2)));
+        made.set("segments", AnyVector());
+        for (const AnyDict& file : files) made.addSegment(AnyVector(source(2, file)), AnyVector(file));
+        return made;
+    }
+    QvTaskState good(int number) const { return task("out" + std::to_string(number) + ".x", {wav_}); }
+    AnyDict missing() const { return entry(folder_.file("missing.wav"), AnyDict()); }
+    // The files that begin with the output's name.
+    Texts outputs(int number) const {
+        Texts names;
+        for (const auto& file : std::filesystem::directory_iterator(folder_.path()))
+            if (file.path().filename().string().rfind("out" + std::to_string(number), 0) == 0)
+                names.push_back(file.path().string());
+        return names;
+    }
+    bool isWritten(int number) const { return !outputs(number).empty(); }
+
+    AnyDict wav_ = sound("in.wav", 4800, 7, 48000);
+};
