@@ -19,7 +19,8 @@ constexpr int nothingUsed = 0x7FFFFFFF;
 constexpr int valueBytes = 4;
 constexpr int peak = 8388607;  // of 24 bits
 constexpr double one = 65536.0;
-constexpr int block = 256;  // samples that are summed at a time, so that they stay in the cache
+constexpr int block = 256;      // samples that are summed at a time, so that they stay in the cache
+constexpr int rowsAtOnce = 16;  // output channels
 constexpr const char* className = "QvAudioMix";
 
 const std::int32_t* valuesOf(const QvPcm& pcm, int sample) {
@@ -103,7 +104,7 @@ void QvAudioMix::_sumOutput(int out, int from, int samples, const TPtrList<QvPcm
         for (int channel = first; channel < usedChannels_[sizeOf(stream)]; ++channel)
             if (weights[channel] != 0)
                 qvmix::addWeighted(sums, valuesOf(pcm, from) + channel, sizeOf(pcm.channels()),
-                                   sizeOf(samples), qvmix::Weight(weights[channel]));
+                                   sizeOf(samples), weights[channel]);
     }
 }
 
@@ -118,13 +119,16 @@ int QvAudioMix::mixChannels(int samples, QvPcm& out, const TPtrList<QvPcm>& in) 
         QV_ASSERT(pcm.channels() >= usedChannels_[sizeOf(stream)]);
     }
     out.setSamples(samples);
+    std::int32_t rows[rowsAtOnce * block];
     for (int from = 0; from < samples; from += block) {
         const int count = std::min(block, samples - from);
         auto* to = reinterpret_cast<std::int32_t*>(out.ptr(from));
-        for (int channel = 0; channel < nrOutChannels_; ++channel) {
-            std::int32_t sums[block] = {};
-            _sumOutput(channel, from, count, in, sums);
-            for (int i = 0; i < count; ++i) to[i * nrOutChannels_ + channel] = sums[i];
+        for (int first = 0; first < nrOutChannels_; first += rowsAtOnce) {
+            const int channels = std::min(rowsAtOnce, nrOutChannels_ - first);
+            std::fill_n(rows, channels * block, 0);
+            for (int channel = 0; channel < channels; ++channel)
+                _sumOutput(first + channel, from, count, in, rows + channel * block);
+            qvmix::interleave(to + first, sizeOf(nrOutChannels_), rows, block, channels, sizeOf(count));
         }
     }
     if (samples == 0) return QvStatus::ok;

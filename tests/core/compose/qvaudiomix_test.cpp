@@ -19,7 +19,7 @@ struct Input {
 };
 
 TEST(QvAudioMix, EachProductIsShiftedBySelf) {
-    constexpr int samples = 1003, outs = 3;
+    constexpr int samples = 1003;
     std::vector<Input> inputs;
     AnyVector counts;
     for (const int channels : {1, 2, 5, 1}) {
@@ -27,42 +27,47 @@ TEST(QvAudioMix, EachProductIsShiftedBySelf) {
                             counts.size() == 3 ? 0 : 8);
         counts.append(Any(channels));
     }
-    QvAudioMix mix;
-    mix.init(outs, counts);
-    double weights[outs][4][5] = {};
-    const struct {
-        int out, stream, channel;
-        double weight;
-    } rows[] = {{0, 0, 0, 1.0},  {0, 1, 1, -0.3333}, {0, 2, 4, 0.7071},  {1, 2, 2, 2.5}, {1, 2, 3, -1.0},
-                {1, 1, 0, 1e-5}, {0, 3, 0, -31000},  {1, 3, 0, 0.99999}, {1, 0, 0, 0.0}};
-    for (const auto& row : rows) {
-        mix.setWeight(row.out, row.stream, row.channel, row.weight);
-        weights[row.out][row.stream][row.channel] = row.weight;
-    }
-    EXPECT_EQ(mix.maxNrInChannels(1), 2);
-    EXPECT_EQ(mix.weight(0, 0, 0), 65536.0);
     TPtrList<QvPcm> list;
     for (Input& input : inputs) list.append(&input.pcm);
-    QvPcm out;
-    out.init(10, outs, 4, 48000);
-    ASSERT_EQ(mix.mixChannels(samples, out, list), 0);
-    ASSERT_EQ(out.samples(), samples);
-    const auto* got = reinterpret_cast<const std::int32_t*>(out.ptr(0));
-    for (int t = 0; t < samples; ++t)
-        for (int o = 0; o < outs; ++o) {
-            std::uint32_t sum = 0;
-            for (int s = 0; s < 4; ++s)
-                for (int c = 0; c < counts.at(s).asInt32(); ++c) {
-                    const auto coefficient = static_cast<long long>(weights[o][s][c] * 65536.0 + 0.5);
-                    const long long x =
-                        inputs[static_cast<std::size_t>(s)].value(t * counts.at(s).asInt32() + c);
-                    sum += static_cast<std::uint32_t>(x * coefficient >> 16);
-                }
-            auto wanted = static_cast<std::int32_t>(sum);
-            // The clamp counts values, so it ends after a third of the samples.
-            if (t * outs + o < samples) wanted = std::clamp(wanted, -8388608, 8388607);
-            ASSERT_EQ(got[t * outs + o], wanted) << t << " " << o;
+    for (const int outs : {1, 2, 3, 4, 7, 21}) {
+        SCOPED_TRACE(outs);
+        QvAudioMix mix;
+        mix.init(outs, counts);
+        double weights[21][4][5] = {};
+        const struct {
+            int out, stream, channel;
+            double weight;
+        } rows[] = {{0, 0, 0, 1.0},  {0, 1, 1, -0.3333}, {0, 2, 4, 0.7071}, {1, 2, 2, 2.5},
+                    {1, 2, 3, -1.0}, {1, 1, 0, 1e-5},    {0, 3, 0, -31000}, {1, 3, 0, 0.99999},
+                    {1, 0, 0, 0.0},  {2, 0, 0, 1.0},     {3, 3, 0, 0.5},    {5, 0, 0, -0.25},
+                    {6, 2, 0, 1.0},  {20, 3, 0, 1.0},    {16, 0, 0, 3.0}};
+        for (const auto& row : rows) {
+            if (row.out >= outs) continue;
+            mix.setWeight(row.out, row.stream, row.channel, row.weight);
+            weights[row.out][row.stream][row.channel] = row.weight;
         }
+        EXPECT_EQ(mix.weight(0, 0, 0), 65536.0);
+        QvPcm out;
+        out.init(10, outs, 4, 48000);
+        ASSERT_EQ(mix.mixChannels(samples, out, list), 0);
+        ASSERT_EQ(out.samples(), samples);
+        const auto* got = reinterpret_cast<const std::int32_t*>(out.ptr(0));
+        for (int t = 0; t < samples; ++t)
+            for (int o = 0; o < outs; ++o) {
+                std::uint32_t sum = 0;
+                for (int s = 0; s < 4; ++s)
+                    for (int c = 0; c < counts.at(s).asInt32(); ++c) {
+                        const auto coefficient = static_cast<long long>(weights[o][s][c] * 65536.0 + 0.5);
+                        const long long x =
+                            inputs[static_cast<std::size_t>(s)].value(t * counts.at(s).asInt32() + c);
+                        sum += static_cast<std::uint32_t>(x * coefficient >> 16);
+                    }
+                auto wanted = static_cast<std::int32_t>(sum);
+                // The clamp counts values, so it ends before the last samples of several channels.
+                if (t * outs + o < samples) wanted = std::clamp(wanted, -8388608, 8388607);
+                ASSERT_EQ(got[t * outs + o], wanted) << t << " " << o;
+            }
+    }
 }
 
 // Coefficients of 64 bits come from stored matrices alone.
@@ -70,6 +75,7 @@ TEST(QvAudioMix, StoresAndRestores) {
     QvAudioMix mix;
     mix.initLinear(AnyVector(2, 1));
     EXPECT_EQ(mix.nrOutChannels(), 3);
+    EXPECT_EQ(mix.maxNrInChannels(0), 2);
     EXPECT_EQ(mix.weight(2, 1, 0), 65536.0);
     EXPECT_EQ(mix.weight(1, 0, 1), 65536.0);
     EXPECT_EQ(mix.weight(1, 0, 0), 0.0);
