@@ -158,6 +158,12 @@ enum class Msg : unsigned short {
     soundClipped,
     loudnessNoSound,
     loudnessFailed,
+    // mixes
+    mixInput,
+    mixNone,
+    mixWrong,
+    mixName,
+    mixNothing,
     // comparing
     compareSizes,
     compareNothing,
