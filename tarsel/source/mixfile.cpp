@@ -93,8 +93,11 @@ std::unique_ptr<QvDecodePipe> openMix(const std::string& name, const AnyDict& se
 void requireMixed(const std::string& name, const QvDecodePipe& decoder) {
     const std::string reason = textOf(decoder.QvCodec::getParam("inputFailure"));
     if (reason.empty()) return;
-    for (const std::string& file : inputsOf(decoder)) {
-        if (isMixName(file)) continue;  // might be this one again; the reason says what is in it
+    const QvAudioMixDecSetup setup = setupOf(decoder);
+    for (const Any& input : setup.inFileNames()) {
+        const std::string file = textOf(input);
+        // A mix might be this one again; the reason says what is in it.
+        if (isMixName(file) || setup.decoder(input)) continue;
         std::string why;
         try {
             const Source source(file, "");
