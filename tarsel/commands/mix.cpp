@@ -115,7 +115,7 @@ AnyDict parseChannel(const std::string& text) {
 }
 
 AnyDict mixGiven(const Given& given) {
-    if (given.channels.empty() && given.file.empty()) throw failure(Msg::mixNothing);
+    if (given.channels.empty() && given.file.empty()) throw failure(Msg::mixNothing, {"--ch"});
     if (!given.channels.empty() && !given.file.empty())
         throw failure(Msg::optionsExclude, {"--ch", given.file});
     if (given.channels.empty()) return readMix(given.file);
@@ -198,8 +198,7 @@ void printText(const Json& mix) {
 
 void mix(const Given& given) {
     const AnyDict setup = mixGiven(given);
-    const std::string name = given.file.empty() ? "--ch" : given.file;
-    const std::unique_ptr<QvDecodePipe> decoder = openMix(name, setup);
+    const std::unique_ptr<QvDecodePipe> decoder = openMix(given.file, setup);
     if (!given.output.empty()) write(given, setup, mixedFiles(*decoder));
     if (!given.json && !given.output.empty()) return;
     const Json described = describe(setup, *decoder);

@@ -11,6 +11,7 @@ constexpr const char* kMix = "AudioInterleave";
 constexpr const char* kMono = "MonoInterleave";
 
 [[noreturn]] void refuse(const std::string& name, const std::string& why) {
+    if (name.empty()) throw failure(Msg::mixSources, {"--ch", why});
     throw failure(Msg::mixInput, {name, why});
 }
 
@@ -104,7 +105,8 @@ void requireMixed(const std::string& name, const QvDecodePipe& decoder) {
         } catch (const Failure& failure) {
             why = failure.what();
         }
-        if (!why.empty()) throw Failure(Exit::input, "can't open " + inQuotes(name) + ": " + why);
+        if (why.empty()) continue;
+        throw Failure(Exit::input, (name.empty() ? "--ch" : "can't open " + inQuotes(name)) + ": " + why);
     }
     refuse(name, reason);
 }

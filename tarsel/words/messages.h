@@ -160,6 +160,7 @@ enum class Msg : unsigned short {
     loudnessFailed,
     // mixes
     mixInput,
+    mixSources,
     mixNone,
     mixWrong,
     mixName,
