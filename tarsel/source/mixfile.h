@@ -14,7 +14,8 @@ bool isMixName(const std::string& name);  // "x.mmf"
 AnyDict readMix(const std::string& name);
 
 // An open decoder of a metafile, null if it is one of something else; or of a set-up, which messages call
-// `name`. Throws Failure (input), also for an input of the mix that can't be opened.
+// `name`, or "--ch" where that is empty. Throws Failure (input), also for an input of the mix that can't be
+// opened.
 std::unique_ptr<QvDecodePipe> openMix(const std::string& name);
 std::unique_ptr<QvDecodePipe> openMix(const std::string& name, const AnyDict& setup);
 
