@@ -60,7 +60,7 @@ constexpr QvBuiltinRow registered[] = {
     {"rawavimux",    muxer,        "Uncompressed AVI muxer",         "AVI Stream",                 newRawavimux},
     {"wavdec",       decoder,      "WAV file import",                "WAV file import",            newWavdec,
      {.exts = "wav", .priority = 10}},
-    {"aumixdec",     decoder,      "Mixing audio import",            "Mixing audio import",        nullptr,
+    {"aumixdec",     decoder,      "Mixing audio import",            "Mixing audio import",        newAumixdec,
      {.exts = "mmf", .priority = 11}},
     {"mvprocess",    videoPipe,    "Multi-View process pipeline",    "MV process",                 nullptr},
     {"mvmetadec",    decoder,      "MV interleaving importer",       "MV import",                  nullptr,

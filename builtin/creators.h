@@ -11,6 +11,7 @@ QvCodec* newRawdec();
 QvCodec* newTestgen();
 QvCodec* newSubimport();
 QvCodec* newWavdec();
+QvCodec* newAumixdec();
 QvCodec* newSccdec();
 QvCodec* newFilesink();
 QvCodec* newNullsink();

@@ -97,6 +97,7 @@ int run(int argc, char** argv) {
     addTask(line, signals);
     addInfo(line);
     addLoudness(line);
+    addMix(line, signals);
     addCaptions(line, signals);
     addFrame(line, signals, version);
     addCompare(line, signals);

@@ -8,6 +8,7 @@
 // Indexes out of range are assertions.
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 #include <vector>
 
@@ -43,8 +44,11 @@ class QV_API QvAudioMix {
     int mixChannels(int samples, QvPcm& out, const TPtrList<QvPcm>& in) const;
 
     void store(AnyDict& dict) const;
-    // -1, and no matrix, if the dictionary is none of a mix.
+    // -1, and no matrix, if the dictionary is none of a mix, has a weight outside of it, or is too large.
     int restore(const AnyDict& dict);
+
+    // Above this number of elements a stored matrix is refused.
+    static constexpr long long maxElements = 16LL << 20;
 
   private:
     int nrOutChannels_ = 0;
@@ -52,4 +56,10 @@ class QV_API QvAudioMix {
     std::vector<int> usedChannels_;      // of each stream
     std::vector<int> firstChannel_;      // [output][stream], the lowest with a weight; 0x7FFFFFFF for none
     std::vector<int64_t> coefficients_;  // [output][stream][channel]
+
+    void _make(int nrOut, int nrIn, int maxChannels);
+    std::size_t _pair(int out, int stream) const;
+    std::size_t _index(int out, int stream, int channel) const;  // asserts the ranges
+    void _setCoefficient(int out, int stream, int channel, int64_t coefficient);
+    void _sumOutput(int out, int from, int samples, const TPtrList<QvPcm>& in, int32_t* sums) const;
 };

@@ -22,6 +22,8 @@ class QvDecodePipe;
 
 class QV_API QvAudioMixDecSetup {
   public:
+    static constexpr int maxChannels = 256;  // what check() lets pass; also of a file, and streams of a file
+
     QvAudioMixDecSetup() = default;
 
     // Also makes as many output channels as files, all silent, and forgets the decoders. 0.
@@ -59,7 +61,7 @@ class QV_API QvAudioMixDecSetup {
 
     void store(AnyDict& dict) const;
     int restore(const AnyDict& dict);  // -1 if it is none of a set-up, which stays as it was
-    int save(const Any& path) const;   // as a metafile
+    int save(const Any& path) const;   // as a metafile: QvMetafile::save
     // From a metafile: its code if it can't be opened; -1 if it holds no set-up. The log has the reason.
     int load(const Any& path);
 

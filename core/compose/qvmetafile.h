@@ -34,7 +34,7 @@ class QV_API QvMetafile {
     // Why open() would refuse the file, or meet an assertion: with the line where it is known. Empty if it
     // would do neither.
     static std::string check(const Any& path);
-    // 0, or the XML writer's code.
+    // 0. Throws QvFileException as XmlParser::storeXmlTree does.
     int save(const Any& path);
     // Writes the inputs of a decoder that is made of others ("isMeta", "metaData"). -1 if it is none. A null
     // decoder and an empty path are assertions.

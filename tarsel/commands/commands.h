@@ -10,6 +10,7 @@ class Signals;
 void addTranscode(CommandLine& line, Signals& signals, const std::string& version);
 void addInfo(CommandLine& line);
 void addLoudness(CommandLine& line);
+void addMix(CommandLine& line, Signals& signals);
 void addCaptions(CommandLine& line, Signals& signals);
 void addModules(CommandLine& line);
 void addFormats(CommandLine& line);

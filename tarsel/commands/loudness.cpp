@@ -1,10 +1,12 @@
 #include <algorithm>
+#include <climits>
 #include <cmath>
 #include <cstdio>
 
 #include "tarsel/commands/commands.h"
 #include "tarsel/host/console.h"
 #include "tarsel/job/progress.h"
+#include "tarsel/source/mixfile.h"
 #include "tarsel/source/source.h"
 #include "tarsel/words/commandline.h"
 #include "tarsel/words/json.h"
@@ -69,8 +71,11 @@ QvLoudness& measure(const Source& source, int stream, QvLoudness& meter) {
         refuse(source, stream,
                std::to_string(channels) + " channels at " + std::to_string(rate) + " Hz can't be measured");
     Shown shown(source, stream);
+    // A mix gives some silence after its end.
+    long long left = isMixName(source.name()) ? decoder.nrSamples(stream) : LLONG_MAX;
     for (;;) {
-        const int read = decoder.readSamples(kBlock, stream);
+        if (left < 1) return meter;
+        const int read = decoder.readSamples(static_cast<int>(std::min<long long>(kBlock, left)), stream);
         if (read < 0 && read != QvStatus::endOfStream) throw failure(Msg::readFailed, {source.name()});
         const QvPcm* pcm = decoder.getAudioPtr(stream);
         if (read < 1 || !pcm || pcm->samples() < 1) return meter;
@@ -78,6 +83,7 @@ QvLoudness& measure(const Source& source, int stream, QvLoudness& meter) {
         if (added == QvStatus::outOfMemory) throw std::bad_alloc();
         if (added != QvStatus::ok) refuse(source, stream, "its format changes");
         shown.update(meter.samples());
+        left -= read;
     }
 }
 

@@ -8,6 +8,7 @@
 #include "tarsel/host/files.h"
 #include "tarsel/host/memory.h"
 #include "tarsel/source/captionfile.h"
+#include "tarsel/source/mixfile.h"
 #include "tarsel/source/picturefile.h"
 #include "tarsel/source/wavformat.h"
 #include "tarsel/words/keyvalues.h"
@@ -139,6 +140,7 @@ Source::Source(const std::string& spec, const std::string& raw) : name_(spec) {
         raw.empty() ? openFile() : openRaw(raw);
     }
     open_ = decoder_.get();
+    takeMixed();
 }
 
 Source::Source(const std::string& name, QvDecodePipe& decoder)
@@ -148,6 +150,7 @@ Source::Source(QvDecodePipe& decoder) : open_(&decoder) {
     name_ = decoder.QvCodec::getParam("filename").toString().asString("");
     isFile_ = !decoder.QvCodec::getParam("isMeta").isTrue();
     if (isFile_) files_.push_back(name_);
+    takeMixed();
 }
 
 Source::Source(const std::string& name, std::unique_ptr<QvDecodePipe> decoder)
@@ -283,12 +286,20 @@ void Source::refuseFile(const std::string& decoder) const {
     refuse(opens || !*codec->errorDesc() ? "no decoder can read it" : codec->errorDesc());
 }
 
+void Source::takeMixed() {
+    requireMixed(name_, *open_);
+    for (const std::string& file : mixedFiles(*open_)) files_.push_back(file);
+}
+
 void Source::openFile() {
+    if (isMixName(name_)) decoder_ = openMix(name_);
+    if (decoder_) return;
     const Any ext = QvFile::getExt(Any(name_.c_str()), true);
     const Any params = openParameters(name_);
     decoder_.reset(
         QvDecFactory::decodePipe(Any(name_.c_str()), Any(), nullptr, params.isValid() ? &params : nullptr));
     if (decoder_) return;
+    if (isMixName(name_)) readMix(name_);  // which refuses it
     const AnyVector candidates = qv_registry()->decoders(ext.asString());
     const std::unique_ptr<AnyVector> exts(qv_registry()->inputExts(false, false));
     if (candidates.empty()) {
@@ -330,6 +341,7 @@ void Source::selectAll() {
 }
 
 std::string Source::damage() const {
+    if (const std::string mixed = mixDamage(*open_); !mixed.empty()) return mixed;
     for (int i = 0; i < open_->nrStreams(kSubpicture); ++i)
         if (const long long bytes = open_->getStreamParam(kSubpicture, i, "unread").asInt64(0); bytes > 0)
             return "the last " + std::to_string(bytes) + " bytes of its text can't be read";

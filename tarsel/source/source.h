@@ -30,7 +30,7 @@ class Source {
     // Bytes of the file; negative when it is none.
     long long bytes() const;
     bool isFile() const { return isFile_; }
-    // What is read: the file, or the picture that the generator shows.
+    // What is read: the file and what it names, or the picture that the generator shows.
     const std::vector<std::string>& files() const { return files_; }
 
     // Of the first video stream.
@@ -47,6 +47,7 @@ class Source {
     void openGenerator(const std::string& spec);
     void openRaw(const std::string& raw);
     void openFile();
+    void takeMixed();  // the files of a mix
     [[noreturn]] void refuseFile(const std::string& decoder) const;
     [[noreturn]] void refuse(const std::string& why) const;
 

@@ -158,6 +158,13 @@ constexpr Message kMessages[] = {
     {Msg::soundClipped,    Exit::done,   "audio stream {text} of {file} is clipped",            "{text} of its samples were beyond full scale",                          "lower it with --volume or --normalize"},
     {Msg::loudnessNoSound, Exit::input,  "{file} has no sound",                                 "there is nothing to measure",                                           "'tarsel info' shows what it holds"},
     {Msg::loudnessFailed,  Exit::input,  "can't measure {file}",                                "audio stream {text}: {system}",                                         "check the file"},
+    // mixes
+    {Msg::mixInput,   Exit::input, "can't open {file}",  "{system}",                               "check the files that it names"},
+    {Msg::mixSources, Exit::input, "{option}",           "{system}",                               "'tarsel info' shows what a file holds"},
+    {Msg::mixNone,    Exit::input, "can't open {file}",  "it holds no mix of sounds",              "'tarsel mix' makes one"},
+    {Msg::mixWrong,   Exit::usage, "{option}",           "{name} is no channel of a mix",          "give POSITION=FILE, as L=a.wav, L=a.wav:1*0.5 or L=a.wav+b.wav:0.1"},
+    {Msg::mixName,    Exit::usage, "can't write {file}", "a mix is a file in .mmf",                "give it a name in .mmf"},
+    {Msg::mixNothing, Exit::usage, "{option}",           "without it there is nothing to mix",     "give --ch POSITION=FILE for each channel, or a file in .mmf"},
     // comparing
     {Msg::compareSizes,       Exit::usage,  "{file} and {file} can't be compared",   "their pictures are {text} and {text}",               "convert one with 'tarsel transcode --size'"},
     {Msg::compareNothing,     Exit::usage,  "{file} and {file} can't be compared",   "no picture of one has a counterpart in the other",   "give another --offset"},

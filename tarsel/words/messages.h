@@ -158,6 +158,13 @@ enum class Msg : unsigned short {
     soundClipped,
     loudnessNoSound,
     loudnessFailed,
+    // mixes
+    mixInput,
+    mixSources,
+    mixNone,
+    mixWrong,
+    mixName,
+    mixNothing,
     // comparing
     compareSizes,
     compareNothing,

@@ -41,6 +41,8 @@ JOBS = [
         ["transcode", "in3.wav", "--map", "2,1,-", "--volume", "-6", "--samplerate", "48000", "-o", "mix.wav", "-y"]),
     Job("joined", ["transcode", "in.wav", "in3.wav", "--map", "a:1.2,a:0.0", "-o", "one.wav", "-y"],
         ["transcode", "in.wav", "--map", "1", "-o", "one.wav", "-y"]),
+    Job("mix", ["mix", "--ch", "L=in.wav:0", "--ch", "R=in3.wav:1*0.5", "-o", "x.mmf", "-y"],
+        ["mix", "--ch", "M=in3.wav:1", "-o", "x.mmf", "-y"]),
     Job("loudness", ["loudness", "in3.wav", "--json"], stdout=True),
     Job("frame", ["frame", *CLIP, "--at", "0.2", "-o", "shot.png", "-y"], ["frame", *CLIP, "-o", "shot.png", "-y"]),
     Job("sheet", ["frame", *CLIP, "--sheet", "12x1", "-o", "sheet.png", "-y"],

@@ -1,5 +1,7 @@
 #include "tarsel/job/plan/jobinput.h"
 
+#include <algorithm>
+
 QvRatio InputStream::rate() const {
     return type == qvVideoStream ? picture.rate.rate() : QvRatio(sound.samplerate, 1);
 }
@@ -27,7 +29,8 @@ JobInput readInput(const Source& source) {
         stream.type = qvAudioStream;
         // Of a join these are with the silence that fills segments.
         stream.units = decoder.getAudioParam(i, "samples").asInt64(decoder.nrSamples(i));
-        stream.sound = {ask("samplerate"), ask("channels"), ask("bitsPerSample")};
+        // A mix has 32 bits, of which 24 are used.
+        stream.sound = {ask("samplerate"), ask("channels"), std::min(ask("bitsPerSample"), 24)};
         input.audio.push_back(stream);
     }
     return input;

@@ -1,0 +1,48 @@
+// An input of the mix: one stream of a decoder, brought to 32 bits at the rate of the mix.
+#pragma once
+
+#include <memory>
+#include <string>
+
+#include "core/decode/qvinputstream.h"
+#include "core/media/qvpcm.h"
+
+class FiltersState;
+class QvAProcessPipe;
+
+class ADecStream : public QvIStream {
+  public:
+    // The decoder is open and outlives this.
+    ADecStream(QvDecodePipe* decoder, int number, const Any& file);
+    ADecStream(const ADecStream&) = delete;
+    ADecStream& operator=(const ADecStream&) = delete;
+    ~ADecStream() override;
+
+    // Selects the stream, and makes what converts it. `filters` may be null. 0, or a status with the reason.
+    int prepare(int targetRate, const FiltersState* filters, std::string& reason);
+
+    // Fills the buffer with this many samples, silence where there are no more. 0; -4 after the end; else it
+    // failed. The status stays until the next seek, and the stream is silent.
+    int read(int count);
+    // To a sample at the rate of the mix. Filters start anew there. 0, -4 or -1.
+    int seek(long long sample);
+
+    const Any& file() const { return file_; }  // "filename" of the decoder
+    QvPcm& pcm() { return pcm_; }
+    int channels() const { return channels_; }
+    long long targetSamples() const;  // the length at the rate of the mix
+
+  private:
+    Any file_;
+    std::unique_ptr<QvAProcessPipe> pipe_;  // null: the samples are as the mix takes them
+    int status_ = 0;
+    QvPcm pcm_;
+    int targetRate_ = 0;
+    int sourceRate_ = 0;
+    int channels_ = 0;
+    long long samples_ = 0;  // at its own rate
+
+    int readPipe(int count);
+    int readPlain(int count);
+    int append(const QvPcm& from, int count);
+};
