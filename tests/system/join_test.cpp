@@ -112,6 +112,16 @@ TEST_F(Join, SoundAloneIsExactToTheSample) {
     EXPECT_TRUE(samples("o.wav") == wanted);
 }
 
+TEST_F(Join, OneCutOfTheGeneratorIsAPlainTask) {
+    const std::string generator = "testgen:duration=2";
+    works({"transcode", generator, "--cut", "0.2-0.6", "--save-task", "t.xml", "-o", "a.raw"});
+    works({"transcode", generator, "--from", "0.2", "--to", "0.6", "-o", "b.raw"});
+    EXPECT_EQ(contents("a.raw"), contents("b.raw"));
+    EXPECT_EQ(contents("a.wav"), contents("b.wav"));
+    works({"run", "t.xml", "-y"});
+    EXPECT_EQ(contents("a.raw"), contents("b.raw"));
+}
+
 TEST_F(Join, WhatASegmentLacksIsBlackOrSilent) {
     works(Words{"transcode", "--join", "p.yuv@0f-3f", "s.wav@0-0.1", "p.yuv+s.wav@5f-7f", "-o", "o.yuv"} +
           kRaw);

@@ -128,7 +128,7 @@ TEST_F(Task, AnInputThatLacksAStreamIsNamed) {
     const std::string address = "first=\"2\" second=\"0\"";
     task.replace(task.find(address), address.size(), "first=\"2\" second=\"4\"");
     folder.write("job.xml", task);
-    fails(3, {"run", "job.xml"}, {"'job.xml' is no sound task", "has no audio stream 4"});
+    fails(3, {"run", "job.xml"}, {"'job.xml' is no sound task", "it takes audio stream 4 of"});
 }
 
 TEST_F(Task, DamagedTasksAreRefusedByName) {

@@ -15,10 +15,13 @@ void refuse(bool given, const char* option) {
     if (given) throw failure(Msg::joinRefuses, {option});
 }
 
-AnyDict storedInput(const Source& source, const std::string& name) {
+// Several segments are told apart by the names that were typed; a task of one finds its decoder by the name
+// that the decoder gives itself, which is another one for the test generator.
+AnyDict storedInput(const Source& source, const std::string& name, bool alone) {
     AnyDict decoder;
     source.decoder().store(decoder);
-    return AnyDict("filename", name.c_str(), "decoder", Any(decoder));
+    const Any own = alone ? source.decoder().QvCodec::getParam("filename") : Any();
+    return AnyDict("filename", own.isText() ? own : Any(name.c_str()), "decoder", Any(decoder));
 }
 
 std::string inSeconds(const std::string& time, const QvFramerate& rate) {
@@ -91,7 +94,7 @@ int JoinPlanner::inputNumber(const std::string& name) {
     const std::unique_ptr<Source> source = open_(name);
     names_.push_back(name);
     inputs_.push_back(readInput(*source));
-    join_.inputs.push_back(storedInput(*source, name));
+    join_.inputs.push_back(storedInput(*source, name, words().size() == 1));
     files_.insert(files_.end(), source->files().begin(), source->files().end());
     return static_cast<int>(names_.size()) - 1;
 }
