@@ -43,9 +43,10 @@ struct Measured {
 unsigned measurable(unsigned fourcc) {
     QvFrame probe;
     QvPictureQuality quality;
-    const bool fits = probe.init(fourcc, 16, 16) == QvStatus::ok &&
-                      QvQualityMeter().measure(probe, probe, quality) == QvStatus::ok;
-    return fits ? fourcc : QvFourcc::BGR4;
+    int result = probe.init(fourcc, 16, 16);
+    if (result == QvStatus::ok) result = QvQualityMeter().measure(probe, probe, quality);
+    if (result == QvStatus::outOfMemory) throw std::bad_alloc();
+    return result == QvStatus::ok ? fourcc : QvFourcc::BGR4;
 }
 
 // The pictures of an input in one format.

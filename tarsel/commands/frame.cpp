@@ -137,10 +137,10 @@ void saveSheet(const Source& source, PictureReader& reader, const Given& given) 
     // The middle of each of `count` equal parts of the video.
     const auto middle = [&](int i) { return (2LL * i + 1) * reader.frames() / (2LL * count); };
     Reading reading(given, source, reader, middle(count - 1));
-    for (int i = 0; i < count; ++i) {
-        sheet.clip(shrinker.convert(reader.at(middle(i))), 0, 0, kGap + i % grid.width * (width + kGap),
-                   kGap + i / grid.width * (height + kGap), width, height);
-    }
+    for (int i = 0; i < count; ++i)
+        if (sheet.clip(shrinker.convert(reader.at(middle(i))), 0, 0, kGap + i % grid.width * (width + kGap),
+                       kGap + i / grid.width * (height + kGap), width, height) != QvStatus::ok)
+            throw std::bad_alloc();
     reading.done();
     save(sheet, given);
 }
