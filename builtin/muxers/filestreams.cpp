@@ -137,8 +137,10 @@ std::string FileFeed::measure() {
 double FileFeed::seconds() const {
     if (stream_.type == qvVideoStream && announced_)
         return static_cast<double>(unit_) / stream_.framerate.rate().ratio();
-    if (stream_.type == qvAudioStream && sampleBytes_ > 1)
-        return static_cast<double>(written_ / sampleBytes_) / stream_.samplerate;
+    if (stream_.type == qvAudioStream && sampleBytes_ > 1) {
+        const long long samples = written_ / sampleBytes_;
+        return static_cast<double>(samples) / stream_.samplerate;
+    }
     // Nothing is known of its time.
     return static_cast<double>(written_) / static_cast<double>(length_);
 }

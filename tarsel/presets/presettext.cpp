@@ -101,7 +101,7 @@ void addValues(const AnyDict& settings, bool raw, std::string& text) {
         const bool format = raw && name == "type" && value->isInt();
         const std::string shown =
             format ? fourccText(static_cast<unsigned>(value->toInt32())) : valueText(*value);
-        text += "  " + name + " = " + shown + "\n";
+        text.append("  ").append(name).append(" = ").append(shown).append("\n");
     }
 }
 
