@@ -132,6 +132,7 @@ int qvImportOldPresets(const AnyVector& user, QvLoadedPresets& to) {
     for (const Any& element : user) {
         const Any name = element.isDict() ? element.asDict().get("name").toString() : Any();
         if (!element.isDict()) {
+            qv_dbg()->error("Skipping preset, it is no dictionary");
             result = QvStatus::failed;
             continue;
         }

@@ -10,6 +10,7 @@
 #include "tarsel/presets/presetsearch.h"
 #include "tarsel/presets/presetstore.h"
 #include "tarsel/presets/presettext.h"
+#include "tarsel/presets/presetwords.h"
 #include "tarsel/source/source.h"
 #include "tarsel/words/commandline.h"
 #include "tarsel/words/messages.h"
@@ -198,8 +199,7 @@ void check(const Given& given) {
     const int valid = presets.checkPresets(QvUserPresets::describeInvalid);
     for (int i = 0; i < presets.count(); ++i)
         if (QvPreset preset = presets.at(i); !preset.isValid())
-            tell(Level::warning,
-                 inQuotes(preset.name()) + ": " + inLine(preset.error().toString().asString("")));
+            tell(Level::warning, inQuotes(preset.name()) + ": " + inLine(onOneLine(faultOf(preset))));
     const int invalid = presets.count() - valid;
     const std::string file = given.words.empty() ? PresetStore::fileName() : given.words[0];
     if (invalid > 0) throw failure(Msg::presetsInvalid, {file, std::to_string(invalid)});

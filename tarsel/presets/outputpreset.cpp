@@ -4,6 +4,7 @@
 
 #include "tarsel/presets/extensions.h"
 #include "tarsel/presets/presetsearch.h"
+#include "tarsel/presets/presetwords.h"
 #include "tarsel/words/messages.h"
 
 namespace {
@@ -59,8 +60,7 @@ bool isRawEncoder(const QvCodec& encoder) { return isRawEncoderName(encoder.name
 
 OutputPreset::OutputPreset(const QvPreset& preset, const std::string& muxer)
     : preset_(preset), muxer_(muxer.empty() ? defaultMuxer(preset) : muxer) {
-    if (!preset_.isValid())
-        throw failure(Msg::presetInvalid, {name(), preset_.error().toString().asString("")});
+    if (!preset_.isValid()) throw failure(Msg::presetInvalid, {name(), faultOf(preset_)});
     if (!muxer.empty() && !preset_.muxerAllowed(muxer.c_str()))
         throw failure(Msg::presetMuxer, {muxer, name(), namesOf(preset_.muxers())});
 }

@@ -303,6 +303,7 @@ TEST_F(UserPresets, OlderFormSkipsWhatCanNotBeLifted) {
     EXPECT_EQ(names(presets_), "Gone|Text|");
     EXPECT_TRUE(presets_.get("Gone").isDisabled());
     EXPECT_FALSE(presets_.get("Text").isDisabled());
+    EXPECT_TRUE(log_.contains("Skipping preset, it is no dictionary", QvLogMask::error));
     EXPECT_TRUE(
         log_.contains("Skipping preset 'Alien , base profile H264(14) not available.", QvLogMask::debug));
     EXPECT_TRUE(log_.contains("Disabled preset 'Gone', base profile H264_BASELINE (", QvLogMask::warning));
