@@ -31,6 +31,18 @@ std::string defaultMuxer(const QvPreset& preset) {
     return muxer.isString() ? muxer.asString() : "";
 }
 
+// What a user's preset holds is for one multiplexer. For another one that it allows, its encoders stay.
+QvPreset withMuxer(const QvPreset& preset, const char* muxer) {
+    if (!preset.isCustom() || preset.defaultMuxer() == muxer || !preset.muxerAllowed(muxer)) return preset;
+    QvPreset other = preset;
+    other.set("muxer", AnyDict("name", muxer));
+    other.remove("programs");
+    if (Any& streams = other.get("streams"); streams.isVector())
+        for (Any& stream : streams.asVector())
+            if (stream.isDict()) stream.asDict().remove("stream");
+    return other;
+}
+
 // The presets of an extension, none of which is installed.
 Failure missing(const PresetExtension& row) {
     return failure(Msg::outputNoPreset, {"x." + std::string(row.extension)});
@@ -78,7 +90,7 @@ bool OutputPreset::isRaw() const {
 std::unique_ptr<QvEncodePipe> OutputPreset::makePipe(const char* muxer) const {
     std::unique_ptr<QvEncodePipe> pipe(QvEncodePipe::create());
     if (!pipe) throw failure(Msg::outputNoModule, {name()});
-    if (pipe->applyPreset(preset_, 0) != QvStatus::ok)
+    if (pipe->applyPreset(withMuxer(preset_, muxer), 0) != QvStatus::ok)
         throw failure(Msg::presetInvalid, {name(), pipe->errorDesc()});
     pipe->clearStreams();
     const QvMuxer* const present = pipe->getMuxer();

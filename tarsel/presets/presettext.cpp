@@ -87,7 +87,7 @@ Json valueOf(const Any& value) {
     }
     if (value.isInt()) return value.toInt64();
     if (value.isFloat()) return value.asDouble();
-    return validUtf8(valueText(value));
+    return validUtf8(value.isText() ? textOf(value) : valueText(value));
 }
 
 // The settings of one module; those of the raw encoders lie in a dictionary of their own.
@@ -111,6 +111,13 @@ void addSettings(const char* title, const Any& settings, std::string& text) {
     const std::string name = textOf(settings.asDict().get("name"));
     text += title + onOneLine(name) + "\n";
     addValues(settings.asDict(), isRawEncoderName(name), text);
+}
+
+// Profiles of plug-ins have no symbol.
+std::string profileText(const QvPreset& preset) {
+    if (*preset.symbol()) return preset.symbol();
+    if (preset.profile() < 0) return "none";
+    return Any::sprintf("0x%X", static_cast<unsigned>(preset.profile())).asString("");
 }
 
 const char* titleOf(int type) {
@@ -171,7 +178,7 @@ std::string presetText(const QvPreset& preset) {
     const bool valid = checked.checkValid();
     checked.createInfo();
     std::string text = onOneLine(checked.name()) + "\n";
-    text += "profile  " + std::string(checked.symbol()) + "\n";
+    text += "profile  " + profileText(checked) + "\n";
     text += "info     " + onOneLine(textOf(checked.info())) + "\n";
     if (!valid) text += "error    " + onOneLine(faultOf(checked)) + "\n";
     text += "video    " + listOf(wordsOf(checked.videoCodecs())) + "\n";

@@ -288,6 +288,19 @@ TEST_F(Presets, LightUpWithTheModulesOfPlugins) {
     works(coded({"presets", "save", "Small", "--preset", "h264_high", "--size", "64x48"}));
     works(coded(job + Words{"-o", "s.h264", "--preset", "small"}));
     EXPECT_EQ(contents("s.h264").substr(0, 6), "64x48\n");
+    // A preset that was kept for one multiplexer is used with another one, if its base allows both.
+    works(
+        coded({"presets", "save", "Two", "--preset", "two ways", "--muxer", "rawavimux", "--size", "64x48"}));
+    works(coded(job + Words{"-o", "two.avi", "--preset", "two"}));
+    works(coded(job + Words{"-o", "two.raw", "--preset", "two", "--muxer", "rawmux", "--pixel", "UYVY"}));
+    EXPECT_EQ(size("two.raw"), 10LL * 64 * 48 * 2);
+    EXPECT_GT(size("two.avi"), 10LL * 64 * 48);
+    works(coded({"presets", "save", "One", "--preset", "two", "--muxer", "rawmux"}));
+    EXPECT_EQ(
+        json::parse(works(coded({"presets", "show", "One", "--json"})).out)["settings"]["muxer"]["name"],
+        "rawmux");
+    EXPECT_THAT(works(coded({"presets", "show", "One"})).out, HasSubstr("0x2800010"));
+    for (const char* name : {"Two", "One"}) works({"presets", "remove", name});
     const Outcome gone = tarsel({"presets", "check"});
     EXPECT_EQ(gone.status, 5);
     EXPECT_THAT(gone.err, HasSubstr("ase profile 'H264_HIGH' not available - missing plugins?"));
