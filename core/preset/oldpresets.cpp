@@ -47,6 +47,7 @@ const char* nameAt(const AnyDict& params, const char* path) {
 void renameModules(AnyDict& params) {
     for (const char* path : kModuleNames) {
         Any* const name = params.descendant("%s", path);
+        if (name && name->isWString()) *name = name->toString();
         if (!name || !name->isString()) continue;
         const auto* row = std::find_if(std::begin(kRenamed), std::end(kRenamed), [&](const Renamed& one) {
             return one.old == std::string_view(name->asString());
