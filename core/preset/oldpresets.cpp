@@ -47,6 +47,7 @@ const char* nameAt(const AnyDict& params, const char* path) {
 void renameModules(AnyDict& params) {
     for (const char* path : kModuleNames) {
         Any* const name = params.descendant("%s", path);
+        if (name && name->isWString()) *name = name->toString();
         if (!name || !name->isString()) continue;
         const auto* row = std::find_if(std::begin(kRenamed), std::end(kRenamed), [&](const Renamed& one) {
             return one.old == std::string_view(name->asString());
@@ -132,6 +133,7 @@ int qvImportOldPresets(const AnyVector& user, QvLoadedPresets& to) {
     for (const Any& element : user) {
         const Any name = element.isDict() ? element.asDict().get("name").toString() : Any();
         if (!element.isDict()) {
+            qv_dbg()->error("Skipping preset, it is no dictionary");
             result = QvStatus::failed;
             continue;
         }

@@ -10,6 +10,7 @@
 #include "tarsel/presets/presetsearch.h"
 #include "tarsel/presets/presetstore.h"
 #include "tarsel/presets/presettext.h"
+#include "tarsel/presets/presetwords.h"
 #include "tarsel/source/source.h"
 #include "tarsel/words/commandline.h"
 #include "tarsel/words/messages.h"
@@ -17,6 +18,8 @@
 #include "tarsel/words/timespec.h"
 
 namespace {
+
+std::string presetsText(int count) { return std::to_string(count) + (count == 1 ? " preset" : " presets"); }
 
 struct Given {
     std::string action = "list";
@@ -173,8 +176,7 @@ void import(const Given& given) {
     for (const std::string& line : report.lines) say(line);
     for (const std::string& line : report.skipped) tell(Level::warning, inLine(line));
     say("imported " + std::to_string(report.added + report.replaced) + " of " +
-        std::to_string(report.added + report.replaced + static_cast<int>(report.skipped.size())) +
-        " presets");
+        presetsText(report.added + report.replaced + static_cast<int>(report.skipped.size())));
 }
 
 void exportTo(const Given& given, Signals& signals) {
@@ -186,7 +188,7 @@ void exportTo(const Given& given, Signals& signals) {
     const Signals::Watch placing(signals, {.first = {}, .second = [&] { return outputs.leave(); }});
     storePresets(outputs.begin("xml"), chosen);
     outputs.commit();
-    say("wrote " + inQuotes(given.output) + ", " + std::to_string(chosen.count()) + " presets");
+    say("wrote " + inQuotes(given.output) + ", " + presetsText(chosen.count()));
 }
 
 void check(const Given& given) {
@@ -198,12 +200,11 @@ void check(const Given& given) {
     const int valid = presets.checkPresets(QvUserPresets::describeInvalid);
     for (int i = 0; i < presets.count(); ++i)
         if (QvPreset preset = presets.at(i); !preset.isValid())
-            tell(Level::warning,
-                 inQuotes(preset.name()) + ": " + inLine(preset.error().toString().asString("")));
+            tell(Level::warning, inQuotes(preset.name()) + ": " + inLine(onOneLine(faultOf(preset))));
     const int invalid = presets.count() - valid;
     const std::string file = given.words.empty() ? PresetStore::fileName() : given.words[0];
     if (invalid > 0) throw failure(Msg::presetsInvalid, {file, std::to_string(invalid)});
-    say(std::to_string(valid) + " presets are sound");
+    say(presetsText(valid) + (valid == 1 ? " is sound" : " are sound"));
 }
 
 // --- what is chosen

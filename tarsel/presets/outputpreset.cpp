@@ -4,6 +4,7 @@
 
 #include "tarsel/presets/extensions.h"
 #include "tarsel/presets/presetsearch.h"
+#include "tarsel/presets/presetwords.h"
 #include "tarsel/words/messages.h"
 
 namespace {
@@ -28,6 +29,18 @@ std::optional<int> positive(const Any& value) {
 std::string defaultMuxer(const QvPreset& preset) {
     const Any muxer = preset.defaultMuxer();
     return muxer.isString() ? muxer.asString() : "";
+}
+
+// What a user's preset holds is for one multiplexer. For another one that it allows, its encoders stay.
+QvPreset withMuxer(const QvPreset& preset, const char* muxer) {
+    if (!preset.isCustom() || preset.defaultMuxer() == muxer || !preset.muxerAllowed(muxer)) return preset;
+    QvPreset other = preset;
+    other.set("muxer", AnyDict("name", muxer));
+    other.remove("programs");
+    if (Any& streams = other.get("streams"); streams.isVector())
+        for (Any& stream : streams.asVector())
+            if (stream.isDict()) stream.asDict().remove("stream");
+    return other;
 }
 
 // The presets of an extension, none of which is installed.
@@ -59,8 +72,7 @@ bool isRawEncoder(const QvCodec& encoder) { return isRawEncoderName(encoder.name
 
 OutputPreset::OutputPreset(const QvPreset& preset, const std::string& muxer)
     : preset_(preset), muxer_(muxer.empty() ? defaultMuxer(preset) : muxer) {
-    if (!preset_.isValid())
-        throw failure(Msg::presetInvalid, {name(), preset_.error().toString().asString("")});
+    if (!preset_.isValid()) throw failure(Msg::presetInvalid, {name(), faultOf(preset_)});
     if (!muxer.empty() && !preset_.muxerAllowed(muxer.c_str()))
         throw failure(Msg::presetMuxer, {muxer, name(), namesOf(preset_.muxers())});
 }
@@ -78,7 +90,7 @@ bool OutputPreset::isRaw() const {
 std::unique_ptr<QvEncodePipe> OutputPreset::makePipe(const char* muxer) const {
     std::unique_ptr<QvEncodePipe> pipe(QvEncodePipe::create());
     if (!pipe) throw failure(Msg::outputNoModule, {name()});
-    if (pipe->applyPreset(preset_, 0) != QvStatus::ok)
+    if (pipe->applyPreset(withMuxer(preset_, muxer), 0) != QvStatus::ok)
         throw failure(Msg::presetInvalid, {name(), pipe->errorDesc()});
     pipe->clearStreams();
     const QvMuxer* const present = pipe->getMuxer();

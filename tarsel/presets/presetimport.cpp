@@ -5,6 +5,7 @@
 
 #include "tarsel/presets/presetsearch.h"
 #include "tarsel/presets/presetstore.h"
+#include "tarsel/presets/presetwords.h"
 #include "tarsel/words/failure.h"
 
 namespace {
@@ -32,10 +33,8 @@ class SkipLog : public QvLogBase {
     QvLogBase* before_;
 };
 
-// A name of one line.
-std::string cleanName(std::string name) {
-    for (char& c : name)
-        if (static_cast<unsigned char>(c) < 0x20 || c == 0x7F) c = ' ';
+std::string cleanName(const std::string& given) {
+    const std::string name = presetNameOf(given);
     return name.empty() ? "preset" : name;
 }
 
@@ -82,13 +81,14 @@ ImportReport importPresets(const std::string& file, bool overwrite, QvUserPreset
         QvPreset preset = fresh.at(i);
         const std::string given = preset.name();
         std::string name = cleanName(given);
-        preset.set("custom", 1);
         if (form == kOlderForm)
             report.lines.push_back(inQuotes(given) + " converted to the profile " + preset.symbol());
+        if (form == kOlderForm && preset.isDisabled())
+            report.lines.push_back(inQuotes(given) + " is hidden: its profile is not available here");
         if (const auto place = overwrite ? names.placeOf(name) : std::nullopt) {
             name = presets.at(*place).name();
             preset.set("name", name.c_str());
-            presets.set(name.c_str(), preset);
+            presets.AnyVector::set(*place, Any(preset));
             ++report.replaced;
             report.lines.push_back(inQuotes(name) + " replaced");
             continue;
@@ -98,7 +98,8 @@ ImportReport importPresets(const std::string& file, bool overwrite, QvUserPreset
             report.lines.push_back(inQuotes(given) + " renamed to " + inQuotes(name) +
                                    ": the name can't be given, or is in use");
         preset.set("name", name.c_str());
-        names.take(name, presets.append(preset));
+        names.take(name, presets.count());
+        presets.AnyVector::append(Any(preset));  // its name is known to be free
         ++report.added;
     }
     return report;

@@ -4,6 +4,7 @@
 #include <optional>
 
 #include "tarsel/presets/presetstore.h"
+#include "tarsel/presets/presetwords.h"
 #include "tarsel/words/messages.h"
 
 namespace {
@@ -115,9 +116,7 @@ int findUserPreset(const QvUserPresets& presets, const std::string& name) {
 }
 
 void requireFreeName(const std::string& name) {
-    const bool plain =
-        std::none_of(name.begin(), name.end(), [](unsigned char c) { return c < 0x20 || c == 0x7F; });
-    if (name.empty() || !plain) throw failure(Msg::presetNameWrong, {name});
+    if (name.empty() || presetNameOf(name) != name) throw failure(Msg::presetNameWrong, {name});
     const std::vector<Known> builtin = builtinNames();
     if (const Known* const row = find(builtin, name)) throw failure(Msg::presetNameTaken, {name, row->name});
 }

@@ -17,7 +17,7 @@ int presetPlace(const QvUserPresets& presets, const std::string& name);
 int findUserPreset(const QvUserPresets& presets, const std::string& name);
 
 // Throws Failure for a name that no preset of the user may have: that or the symbol of a built-in one, of
-// those too for which modules are missing; one that is empty, or that holds control characters.
+// those too for which modules are missing; one that is empty, or that presetNameOf() would change.
 void requireFreeName(const std::string& name);
 
 // A name as these searches compare it: letters of ASCII are small.

@@ -20,6 +20,9 @@ void loadPresets(const std::string& file, QvUserPresets& presets, int mode, int*
     int version = 0;
     presets.load(name, mode, &version);
     if (version == 0) throw failure(Msg::presetsDamaged, {file, "it changed while it was read"});
+    // Whatever a file says, what is in it is a user's.
+    for (Any& preset : presets)
+        if (preset.isDict()) preset.asDict().set("custom", 1);
     if (form) *form = version;
 }
 

@@ -3,6 +3,7 @@
 #include <vector>
 
 #include "tarsel/presets/outputpreset.h"
+#include "tarsel/presets/presetwords.h"
 #include "tarsel/words/failure.h"
 #include "tarsel/words/timespec.h"
 #include "tarsel/words/valuetext.h"
@@ -60,7 +61,7 @@ std::string listOf(const Json& words) {
 }
 
 std::string lineOf(const Json& row) {
-    const auto text = [&](const char* key) { return row[key].get<std::string>(); };
+    const auto text = [&](const char* key) { return onOneLine(row[key].get<std::string>()); };
     std::string line = "  " + text("name");
     const std::string symbol = text("symbol");
     line.append(line.size() < 44 ? 44 - line.size() : 1, ' ');
@@ -86,7 +87,7 @@ Json valueOf(const Any& value) {
     }
     if (value.isInt()) return value.toInt64();
     if (value.isFloat()) return value.asDouble();
-    return validUtf8(valueText(value));
+    return validUtf8(value.isText() ? textOf(value) : valueText(value));
 }
 
 // The settings of one module; those of the raw encoders lie in a dictionary of their own.
@@ -101,15 +102,26 @@ void addValues(const AnyDict& settings, bool raw, std::string& text) {
         const bool format = raw && name == "type" && value->isInt();
         const std::string shown =
             format ? fourccText(static_cast<unsigned>(value->toInt32())) : valueText(*value);
-        text.append("  ").append(name).append(" = ").append(shown).append("\n");
+        text.append("  ").append(onOneLine(name)).append(" = ").append(onOneLine(shown)).append("\n");
     }
 }
 
 void addSettings(const char* title, const Any& settings, std::string& text) {
     if (!settings.isDict()) return;
     const std::string name = textOf(settings.asDict().get("name"));
-    text += title + name + "\n";
+    text += title + onOneLine(name) + "\n";
     addValues(settings.asDict(), isRawEncoderName(name), text);
+}
+
+// Profiles of plug-ins have no symbol.
+std::string profileText(const QvPreset& preset) {
+    if (*preset.symbol()) return preset.symbol();
+    if (preset.profile() < 0) return "none";
+    return Any::sprintf("0x%X", static_cast<unsigned>(preset.profile())).asString("");
+}
+
+const char* titleOf(int type) {
+    return type == qvVideoStream ? "picture  " : type == qvAudioStream ? "sound    " : "other    ";
 }
 
 }  // namespace
@@ -165,10 +177,10 @@ std::string presetText(const QvPreset& preset) {
     QvPreset checked = preset;
     const bool valid = checked.checkValid();
     checked.createInfo();
-    std::string text = std::string(checked.name()) + "\n";
-    text += "profile  " + std::string(checked.symbol()) + "\n";
-    text += "info     " + textOf(checked.info()) + "\n";
-    if (!valid) text += "error    " + textOf(checked.error()) + "\n";
+    std::string text = onOneLine(checked.name()) + "\n";
+    text += "profile  " + profileText(checked) + "\n";
+    text += "info     " + onOneLine(textOf(checked.info())) + "\n";
+    if (!valid) text += "error    " + onOneLine(faultOf(checked)) + "\n";
     text += "video    " + listOf(wordsOf(checked.videoCodecs())) + "\n";
     text += "audio    " + listOf(wordsOf(checked.audioCodecs())) + "\n";
     text += "muxers   " + listOf(wordsOf(checked.muxers())) + "\n";
@@ -176,7 +188,6 @@ std::string presetText(const QvPreset& preset) {
     addSettings("muxer    ", checked.get("muxer"), text);
     for (const Any& stream : checked.getVector("streams", AnyVector()))
         if (stream.isDict())
-            addSettings(stream.asDict().getInt32("type", -1) == qvVideoStream ? "picture  " : "sound    ",
-                        stream.asDict().get("codec"), text);
+            addSettings(titleOf(stream.asDict().getInt32("type", -1)), stream.asDict().get("codec"), text);
     return text;
 }

@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <cstdio>
 
+#include <qvplugcore/qvplugcore.h>
+
 namespace {
 
 // How many letters are missing, too many, wrong, or, as a pair, the wrong way round.
@@ -59,16 +61,27 @@ std::string inLine(std::string text) {
     return text;
 }
 
+bool isObeyed(char32_t c) {
+    const auto isIn = [c](char32_t first, char32_t last) { return c >= first && c <= last; };
+    // Controls, line and paragraph ends with the overrides of the direction, and its isolates.
+    return isIn(0, 0x1F) || isIn(0x7F, 0x9F) || isIn(0x2028, 0x202E) || isIn(0x2066, 0x2069);
+}
+
 std::string inQuotes(std::string_view text) {
     std::string out = "'";
-    for (const char c : text) {
-        const auto byte = static_cast<unsigned char>(c);
-        if (byte < 0x20 || byte == 0x7F) {
+    for (size_t at = 0; at < text.size();) {
+        const size_t start = at;
+        const char32_t character = QvUtf::next(text, at);
+        const std::string_view bytes = text.substr(start, at - start);
+        const bool stray = character == QvUtf::replacement && bytes != "\xEF\xBF\xBD";
+        if (!stray && !isObeyed(character)) {
+            out += bytes;
+            continue;
+        }
+        for (const char c : bytes) {
             char escape[8];
-            std::snprintf(escape, sizeof escape, "\\x%02x", byte);
+            std::snprintf(escape, sizeof escape, "\\x%02x", static_cast<unsigned char>(c));
             out += escape;
-        } else {
-            out += c;
         }
     }
     return out + "'";

@@ -38,5 +38,8 @@ std::string joined(const std::vector<std::string>& words, std::string_view separ
 // or an abbreviation, and stays on the line.
 std::string inLine(std::string text);
 
-// A file name or text for a message: control characters and stray bytes are escaped, quotes are around it.
+// Whether a terminal acts on a character instead of showing it.
+bool isObeyed(char32_t c);
+
+// A file name or text for a message: such characters and stray bytes are escaped, quotes are around it.
 std::string inQuotes(std::string_view text);

@@ -204,7 +204,7 @@ constexpr Message kMessages[] = {
     {Msg::presetOutput,      Exit::usage,  "-o {file}",                              "its name means a format that the preset {name} does not write", "give it another extension, or another preset"},
     {Msg::outputNoPreset,    Exit::module, "-o {file}",                              "no installed module writes it",                         "'tarsel presets list --all' lists what it waits for; or write .avi, .png, .wav or a raw format such as .yuv"},
     {Msg::matchNoPreset,     Exit::usage,  "--match",                                "it fits a preset to the input, and there is no preset", "give --preset"},
-    {Msg::presetNameWrong,   Exit::usage,  "the name {name} can't be given",         "a preset's name is a text of one line",                 "give another name"},
+    {Msg::presetNameWrong,   Exit::usage,  "the name {name} can't be given",         "a preset's name is a text of one line, of 200 bytes at most, without blanks at its ends", "give another name"},
     {Msg::presetNameTaken,   Exit::usage,  "the name {name} can't be given",         "the built-in preset {name} has it",                     "give another name"},
     {Msg::presetExists,      Exit::usage,  "there is a preset {name}",               "one of your presets has this name",                     "give another name, or --overwrite to replace it"},
     {Msg::presetWords,       Exit::usage,  "presets {option}",                       "it takes {text}",                                       "see 'tarsel presets --help'"},
@@ -212,7 +212,7 @@ constexpr Message kMessages[] = {
     {Msg::presetsNotWritten, Exit::output, "can't change {file}",                    "{text}",                                                "{text}"},
     {Msg::presetLeavesOut,   Exit::done,   "the preset {name} has no {text}",        "that of the inputs is left out",                        ""},
     {Msg::presetCommandLeft, Exit::done,   "the preset {name} has a command for afterwards", "it was not run",                               "give it as --post to run it: {file}"},
-    {Msg::presetsInvalid,    Exit::module, "not all presets of {file} can be used", "{text} of them rest on what is not installed",         "load the plug-ins that they need with --plugins, or remove them"},
+    {Msg::presetsInvalid,    Exit::module, "not all presets of {file} can be used", "{text} of them are faulty, or need what is not installed", "load their plug-ins with --plugins, or remove them"},
     {Msg::outputNoModule,    Exit::module, "can't write {file}",                     "this installation can't write any output",              "install the engine again"},
     {Msg::aviNoModule,       Exit::module, "can't write {file}",                     "this installation has no AVI output",                   "choose another format"},
     // captions

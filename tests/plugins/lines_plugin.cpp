@@ -1,5 +1,5 @@
 // A plug-in with a video encoder under a name that presets wait for. It writes a line of text for each
-// picture, and takes few sizes and rates.
+// picture, and takes few sizes and rates. A preset of its own leaves the choice between two multiplexers.
 #include <string>
 
 #include "core/encode/qvencoder.h"
@@ -76,5 +76,9 @@ QV_API unsigned qv_plugin_abi = qvPluginAbi;
 extern "C" QV_API QvPlugin* plugin_init() {
     static QvPlugin plugin("lines", "An encoder that presets wait for");
     if (plugin.nrModules() == 0) plugin.addModule(new Module);
+    AnyDict preset("profile", 0x2800010, "name", "Two ways", "group", "Tests", "video", "rawvenc");
+    preset.set("audio", "rawaenc");
+    preset.set("muxers", AnyVector("rawmux", "rawavimux"));
+    plugin.setAttr("presets", AnyVector(Any(preset)));
     return &plugin;
 }

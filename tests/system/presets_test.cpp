@@ -71,6 +71,12 @@ TEST_F(Presets, AreKeptRenamedAndRemoved) {
         {2, {"presets", "rename", "loud", "avi_raw"}, {"'Uncompressed AVI'"}},
         {2, {"presets", "save", "H.264 high"}, {"'H.264 High'"}},
         {2, {"presets", "save", "a\nb"}, {"one line"}},
+        {2, {"presets", "save", "stray\xFF"}, {"one line"}},
+        {2, {"presets", "save", "control\xC2\x9B"}, {"one line"}},
+        {2, {"presets", "save", "backwards\xE2\x80\xAE"}, {"one line"}},
+        {2, {"presets", "rename", "loud", std::string(201, 'x')}, {"200 bytes"}},
+        {2, {"presets", "save", " x"}, {"blanks"}},
+        {2, {"presets", "save", " "}, {"blanks"}},
         {2, {"presets", "save"}, {"presets save", "one NAME"}},
         {2, {"presets", "save", "x", "--size", "0x0"}, {"--size"}},
         {2, {"presets", "save", "x", "--muxer", "rawavimux"}, {"rawmux"}},
@@ -157,6 +163,67 @@ TEST_F(Presets, ComeFromFilesOfBothForms) {
     EXPECT_EQ(contents(store()), before);
 }
 
+// What nobody can name or see is not kept, and what is left out is said.
+TEST_F(Presets, FilesOfOthersAreTakenWithCare) {
+    const auto text = [](const std::string& key, const std::string& value) {
+        return "<key>" + key + "</key><str>" + value + "</str>";
+    };
+    const auto number = [](const std::string& key, int value) {
+        return "<key>" + key + "</key><i32>" + std::to_string(value) + "</i32>";
+    };
+    const auto preset = [](const std::string& name, const std::string& entries) {
+        return "<Preset version=\"2.0\" name=\"" + name + "\">" + entries + "</Preset>";
+    };
+    const auto current = [](const std::string& presets) {
+        return "<UserPresets version=\"2.0\"><dict><key>presets</key><vec>" + presets +
+               "</vec></dict></UserPresets>";
+    };
+    constexpr int raw = 0x216000F;
+    const std::string shown = number("profile", raw) + text("info", "one\xC2\x9B\ntwo\xE2\x80\xAE");
+
+    // The store may have been written by hand: what is in it is the user's, whatever it says.
+    folder.write(store(), current(preset("Mine", number("custom", 0) + shown) +
+                                  preset("Far", number("custom", 0) + number("profile", 77))));
+    const Outcome checked = tarsel({"presets", "check"});
+    EXPECT_EQ(checked.status, 5);
+    EXPECT_THAT(checked.err, AllOf(HasSubstr("'Far': "), HasSubstr("1 of them")));
+    EXPECT_THAT(works({"presets"}).out, HasSubstr(" one  two \n"));
+    EXPECT_THAT(works({"presets", "show", "Mine"}).out, HasSubstr(" one  two \n"));
+    works({"presets", "rename", "Mine", "Yours"});
+    EXPECT_EQ(own(), (std::set<std::string>{"Yours", "Far"}));
+
+    // The reason does not repeat the name.
+    folder.write(store(), current(preset("Web", number("profile", raw) +
+                                                    "<key>muxer</key><dict/><key>streams</key><vec/>")));
+    EXPECT_THAT(tarsel({"presets", "check"}).err, HasSubstr("'Web': cannot restore - muxer"));
+
+    fs::remove(folder.file(store()));
+    folder.write("names.xml", current(preset(" a\xC2\x9B"
+                                             "b ",
+                                             shown) +
+                                      preset(std::string(300, 'x'), shown) + preset("\xE2\x80\xAE", shown)));
+    EXPECT_THAT(works({"presets", "import", "names.xml"}).err, HasSubstr("imported 3 of 3"));
+    EXPECT_EQ(own(), (std::set<std::string>{"a b", std::string(200, 'x'), "preset"}));
+
+    const auto part = [&](const std::string& kind, const std::string& module) {
+        return "<key>" + kind + "</key><dict>" + text("codec", module) + "<key>state</key><dict>" +
+               text("name", module) + "</dict></dict>";
+    };
+    folder.write("old.xml", "<userprofiles version=\"1.6\"><dict><key>user</key><vec><i32>7</i32><dict>" +
+                                text("name", "Gone") + "<key>params</key><dict>" + number("origProfile", 14) +
+                                part("video", "h264venc") + part("mux", "rawmux") +
+                                "</dict></dict></vec></dict></userprofiles>");
+    EXPECT_THAT(works({"presets", "import", "old.xml"}).err,
+                AllOf(HasSubstr("'Gone' is hidden"), HasSubstr("kipping preset, it is no dictionary"),
+                      HasSubstr("imported 1 of 2")));
+    EXPECT_THAT(works({"presets"}).out, Not(HasSubstr("Gone")));
+
+    // A folder that can't be made is named itself.
+    folder.write("plain", "");
+    setenv("HOME", folder.file("plain").c_str(), 1);
+    fails(4, {"presets", "save", "Web"}, {"plain/.QVTarselSdk': "});
+}
+
 TEST_F(Presets, GiveAnOutputWhatTheOptionsLeaveOpen) {
     works({"presets", "save", "Web", "--size", "320x180", "--rate", "25", "--pixel", "UYVY", "--channels",
            "1"});
@@ -221,6 +288,19 @@ TEST_F(Presets, LightUpWithTheModulesOfPlugins) {
     works(coded({"presets", "save", "Small", "--preset", "h264_high", "--size", "64x48"}));
     works(coded(job + Words{"-o", "s.h264", "--preset", "small"}));
     EXPECT_EQ(contents("s.h264").substr(0, 6), "64x48\n");
+    // A preset that was kept for one multiplexer is used with another one, if its base allows both.
+    works(
+        coded({"presets", "save", "Two", "--preset", "two ways", "--muxer", "rawavimux", "--size", "64x48"}));
+    works(coded(job + Words{"-o", "two.avi", "--preset", "two"}));
+    works(coded(job + Words{"-o", "two.raw", "--preset", "two", "--muxer", "rawmux", "--pixel", "UYVY"}));
+    EXPECT_EQ(size("two.raw"), 10LL * 64 * 48 * 2);
+    EXPECT_GT(size("two.avi"), 10LL * 64 * 48);
+    works(coded({"presets", "save", "One", "--preset", "two", "--muxer", "rawmux"}));
+    EXPECT_EQ(
+        json::parse(works(coded({"presets", "show", "One", "--json"})).out)["settings"]["muxer"]["name"],
+        "rawmux");
+    EXPECT_THAT(works(coded({"presets", "show", "One"})).out, HasSubstr("0x2800010"));
+    for (const char* name : {"Two", "One"}) works({"presets", "remove", name});
     const Outcome gone = tarsel({"presets", "check"});
     EXPECT_EQ(gone.status, 5);
     EXPECT_THAT(gone.err, HasSubstr("ase profile 'H264_HIGH' not available - missing plugins?"));

@@ -47,8 +47,11 @@ int keepMode(const fs::path& from, const fs::path& to) {
 }  // namespace
 
 SharedFile::SharedFile(const std::string& name) : name_(placeOf(name).string()) {
-    std::error_code error;
-    fs::create_directories(fs::path(name_).parent_path(), error);
+    if (const fs::path folder = fs::path(name_).parent_path(); !folder.empty()) {
+        std::error_code error;
+        fs::create_directories(folder, error);
+        if (error) throw systemFailure(Msg::presetsNotWritten, folder.string(), error.value());
+    }
     const std::string lock = name_ + ".lock";
     lock_.reset(open(lock.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW, kNewFile));
     const int result = lock_ ? lockFile(lock_.get()) : errno;

@@ -285,6 +285,14 @@ TEST_F(UserPresets, OlderFormIsLifted) {
     EXPECT_STREQ(presets_.get("Tape").muxerParams().getString("name"), "dv100mux");
     EXPECT_TRUE(log_.contains("user preset 'Raw' 1.6->2.0 convert - switching profile from NONE(0) to RAW "));
     EXPECT_TRUE(presets_.get("Raw").isValid());
+    // Module names may be wide text.
+    std::string wide = older(rawPreset("Wide"));
+    for (const std::string from = "<str>rawvenc</str>", to = "<wstr>rawvenc</wstr>";
+         wide.find(from) != std::string::npos;)
+        wide.replace(wide.find(from), from.size(), to);
+    ASSERT_EQ(load(presets_, wide, QvUserPresets::keep), 0);
+    EXPECT_STREQ(presets_.get("Wide").symbol(), "RAW");
+    EXPECT_TRUE(presets_.get("Wide").isValid());
     // The names that are in use count as in the current form.
     ASSERT_EQ(load(presets_, older(rawPreset("Raw")), QvUserPresets::keep), 0);
     EXPECT_TRUE(presets_.contains("Raw (1)"));
@@ -303,6 +311,7 @@ TEST_F(UserPresets, OlderFormSkipsWhatCanNotBeLifted) {
     EXPECT_EQ(names(presets_), "Gone|Text|");
     EXPECT_TRUE(presets_.get("Gone").isDisabled());
     EXPECT_FALSE(presets_.get("Text").isDisabled());
+    EXPECT_TRUE(log_.contains("Skipping preset, it is no dictionary", QvLogMask::error));
     EXPECT_TRUE(
         log_.contains("Skipping preset 'Alien , base profile H264(14) not available.", QvLogMask::debug));
     EXPECT_TRUE(log_.contains("Disabled preset 'Gone', base profile H264_BASELINE (", QvLogMask::warning));
