@@ -39,10 +39,6 @@ int QvWatchFolderInput::open(const Any& folder, int mode, const Any* moveTo, con
         qv_log()->error("QvWatchFolderInput::open, %s is not folder.", shown(folder).c_str());
         return QvStatus::cannotParse;
     }
-    if (mode != keep && mode != move && mode != deleteFiles) {
-        qv_log()->error("QvWatchFolderInput::open, unknown mode %d.", mode);
-        return QvStatus::invalidStructure;
-    }
     if (mode == move && !(moveTo && moveTo->isText() && moveTo->isTrue())) {
         qv_log()->error(
             "QvWatchFolderInput::open, 'move to' folder not set, required for QV_WFINPUT_MOVE mode.");
