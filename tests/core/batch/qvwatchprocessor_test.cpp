@@ -174,6 +174,23 @@ TEST_F(QvWatchProcessorTest, ThrowingTargetsFailAlone) {
     EXPECT_EQ(filesIn("z"), Texts{"a.avi"});
 }
 
+// An encoder takes none of the input's streams: nothing would be in the output.
+TEST_F(QvWatchProcessorTest, ATargetWithoutStreamsFails) {
+    struct Silent : QvWatchProcessor {
+        int nameOutput(QvEncodePipe& pipe, const QvWatchTask& task, int target, const Any& file) override {
+            if (target == 0) pipe.clearStreams();
+            return QvWatchProcessor::nameOutput(pipe, task, target, file);
+        }
+    } processor;
+    wav("a.wav", 1);
+    ASSERT_EQ(input_.open(narrow(folder_.file("in")), QvWatchFolderInput::keep), 0);
+    LogCapture log;
+    EXPECT_EQ(processor.process(input_, taskOf({avi("x"), avi("z")})), -1);
+    EXPECT_TRUE(log.contains("transcoded 1 files, failed 1 files"));
+    EXPECT_EQ(filesIn("x"), Texts{});
+    EXPECT_EQ(filesIn("z"), Texts{"a.avi"});
+}
+
 TEST_F(QvWatchProcessorTest, NamesOutputs) {
     QvPreset odd(QvProfile::raw, "x/..\\y");
     QvPreset dots(QvProfile::raw, "..");
