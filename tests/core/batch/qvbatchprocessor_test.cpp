@@ -139,7 +139,12 @@ TEST_F(QvBatchProcessorTest, DamagedTasksFailAlone) {
     };
     collect(Any(static_cast<const AnyDict&>(sound)), "");
     ASSERT_GT(paths.size(), 40u);
-    const Any wrong[] = {Any(),          Any(-7), Any("wrong"), Any(AnyVector()), Any(AnyDict("name", 3)),
+    // A text is taken for the name of the output too.
+    const Any wrong[] = {Any(),
+                         Any(-7),
+                         Any(folder_.file("wrong").c_str()),
+                         Any(AnyVector()),
+                         Any(AnyDict("name", 3)),
                          Any(Pair(9, 9))};
     for (const std::string& path : paths)
         for (const Any& value : wrong) {
