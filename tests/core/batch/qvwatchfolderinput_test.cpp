@@ -203,6 +203,26 @@ TEST_F(QvWatchFolderInputTest, PassesOverWhatIsNoFile) {
     EXPECT_FALSE(fs::exists(inside(bytes)));
 }
 
+// Other systems' separators are letters here.
+TEST_F(QvWatchFolderInputTest, TakesNamesWithBackslashesAsTheyAre) {
+    const Texts names{"a\\b", "b", "c\\", "d:\\..\\b", "\\\\host\\b"};
+    for (const int mode :
+         {QvWatchFolderInput::keep, QvWatchFolderInput::move, QvWatchFolderInput::deleteFiles}) {
+        for (const std::string& name : names) write(name, name);
+        ASSERT_EQ(open(mode), 0);
+        Texts found = drain(), expected = names;
+        std::sort(found.begin(), found.end());
+        std::sort(expected.begin(), expected.end());
+        EXPECT_EQ(found, expected) << mode;
+        for (const std::string& name : names) {
+            EXPECT_EQ(fs::exists(inside(name)), mode == QvWatchFolderInput::keep) << name;
+            if (mode == QvWatchFolderInput::move) {
+                EXPECT_EQ(TempFolder::read(folder_.file("done/" + name)), name);
+            }
+        }
+    }
+}
+
 TEST_F(QvWatchFolderInputTest, LeavesFilesThatItMayNotRead) {
     struct NoAccess : QvPlatform {
         std::FILE* openFile(const char* name, const char* mode) override {

@@ -107,6 +107,14 @@ TEST_F(QvWatchProcessorTest, MakesEveryTargetOfEveryFile) {
     EXPECT_EQ(process(taskOf({})), 0) << "no target is no failure";
 }
 
+TEST_F(QvWatchProcessorTest, BackslashesInANameMakeNoOtherName) {
+    wav("b.wav", 1);
+    wav("a\\b.wav", 2);
+    EXPECT_EQ(process(taskOf({avi("out")}), QvWatchFolderInput::deleteFiles), 0);
+    EXPECT_EQ(filesIn("out"), (Texts{"a_b.avi", "b.avi"}));
+    EXPECT_EQ(filesIn("in"), Texts{});
+}
+
 TEST_F(QvWatchProcessorTest, ATargetThatCanNotBeMadeFailsAlone) {
     wav("a.wav", 1);
     QvPreset unknown(0x2FFFFFF, "Nothing");
@@ -200,6 +208,7 @@ TEST_F(QvWatchProcessorTest, NamesOutputs) {
     EXPECT_EQ(task.outputFilename(1, narrow("/in/a"), "mov"), narrow(folder_.file("out/Raw/a.mov")));
     EXPECT_EQ(task.outputFilename(2, narrow("a.wav"), "mov"), narrow("/o/x_.._y/a.mov"));
     EXPECT_EQ(task.outputFilename(3, narrow("a.wav"), "mov"), narrow("/o/_../a.mov"));
+    EXPECT_EQ(task.outputFilename(0, narrow("C:\\in\\a.wav"), "mov"), narrow(folder_.file("out/a.mov")));
     EXPECT_TRUE(task.outputFilename(0, wide("/in/\xC3\xA4.wav"), "mov").isWString());
     EXPECT_THROW(task.outputFilename(4, narrow("a"), "b"), QvAssertFailure);
 }
