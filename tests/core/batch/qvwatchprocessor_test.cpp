@@ -159,7 +159,8 @@ TEST_F(QvWatchProcessorTest, WithoutItsFoldersNothingBegins) {
     EXPECT_EQ(process(taskOf({raw("out"), raw("file/below")})), -1);
     EXPECT_TRUE(log.contains("Can not create folder " + folder_.file("file/below"), QvLogMask::error));
     EXPECT_EQ(input_.nrFiles(), 1);
-    for (const AnyDict& broken : {AnyDict(), AnyDict("__target__", 5)}) {
+    for (const AnyDict& broken :
+         {AnyDict(), AnyDict("__target__", 5), AnyDict("__target__", AnyDict("outputFolder", ""))}) {
         const QvWatchTask task = taskOf({broken});
         EXPECT_EQ(task.createOutputFolders(), -1);
     }
