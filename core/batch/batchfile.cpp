@@ -1,6 +1,7 @@
 #include "core/batch/batchfile_p.h"
 
 #include <algorithm>
+#include <cstdio>
 #include <string>
 
 #include "core/arch/platform.h"
@@ -28,13 +29,24 @@ std::string nameBeside(const std::string& file) {
     return file + mark;
 }
 
-// A document in place of a file that exists. Throws QvFileException.
+bool isOnDisc(const std::string& file) {
+    QvPlatform& system = qv_platform();
+    std::FILE* const written = system.openFile(file.c_str(), "rb");
+    if (!written) return false;
+    const bool synced = system.sync(written) == 0;
+    return std::fclose(written) == 0 && synced;
+}
+
+// A document in place of a file that exists. It is on the disc before it takes the place: a power cut leaves
+// one of the two. Throws QvFileException.
 int replaceFile(const Any& file, const AnyDict& list) {
     const std::string name = qv_os_name(file), fresh = nameBeside(name);
     const Any target = qv_any_name(fresh, file);
     int result = QvStatus::failed;
     try {
         result = XmlParser::storeDict(target, list, doctype, version);
+        if (result == QvStatus::ok && !isOnDisc(fresh))
+            throw QvFileException("Can not bring the new file to the disc");
         if (result == QvStatus::ok && qv_platform().moveFile(fresh.c_str(), name.c_str(), true) != 0)
             throw QvFileException("Can not replace the file by what was written next to it");
     } catch (...) {

@@ -1,6 +1,8 @@
 // One task of a batch, from its stored state to its end.
 #pragma once
 
+#include <atomic>
+
 #include "core/transcode/task/qvtaskstate.h"
 #include "core/value/any.h"
 
@@ -14,8 +16,8 @@ struct BatchContext {
     BatchControl& control;
     BatchError& error;
     BatchReport& report;
-    int options;  // bits of QvBatchTask
-    bool smartRender;
+    int options;                           // bits of QvBatchTask
+    const std::atomic<bool>& smartRender;  // as it is when a task begins
 };
 
 class BatchTaskRun {

@@ -17,6 +17,19 @@ constexpr int settleTime = 2000;  // milliseconds
 
 std::string shown(const Any& name) { return qv_os_name(name); }
 
+// Of a file in a folder. Names from elsewhere may hold the separators of other systems, which are letters
+// here, and what looks like a drive or a host.
+Any nameOf(const Any& path) {
+    const std::string all = qv_os_name(path);
+    return qv_any_name(all.substr(all.rfind('/') + 1), path);
+}
+
+Any inFolder(const Any& folder, const Any& name) {
+    std::string path = qv_os_name(folder);
+    if (!path.ends_with('/')) path += '/';
+    return qv_any_name(path + qv_os_name(name), folder);
+}
+
 // The key of a name in the dictionaries.
 std::string keyOf(const Any& name) {
     constexpr int maxChars = 32;
@@ -38,10 +51,6 @@ int QvWatchFolderInput::open(const Any& folder, int mode, const Any* moveTo, con
     if (!folder.isText() || !QvFile::isDir(folder)) {
         qv_log()->error("QvWatchFolderInput::open, %s is not folder.", shown(folder).c_str());
         return QvStatus::cannotParse;
-    }
-    if (mode != keep && mode != move && mode != deleteFiles) {
-        qv_log()->error("QvWatchFolderInput::open, unknown mode %d.", mode);
-        return QvStatus::invalidStructure;
     }
     if (mode == move && !(moveTo && moveTo->isText() && moveTo->isTrue())) {
         qv_log()->error(
@@ -87,7 +96,7 @@ int QvWatchFolderInput::_scan() {
     constexpr int filesOnly = 1;
     AnyVector fresh;
     for (const Any& path : QvFile::ls(folder_, filesOnly)) {
-        const Any name = QvFile::getFilename(path);
+        const Any name = nameOf(path);
         const std::string key = keyOf(name);
         if (queued_.isSet(key.c_str())) continue;
         if (mode_ == keep && processed_.isSet(key.c_str())) continue;
@@ -106,11 +115,11 @@ bool QvWatchFolderInput::waitForWriters(int milliseconds) {
 
 void QvWatchFolderInput::_addEligibleFiles(const AnyVector& names) {
     std::vector<long long> before;
-    for (const Any& name : names) before.push_back(QvFile::flength(QvFile::joinPath(folder_, name)));
+    for (const Any& name : names) before.push_back(QvFile::flength(inFolder(folder_, name)));
     if (!waitForWriters(settleTime)) return;
     for (int i = 0; i < names.size(); ++i) {
         const Any& name = names.at(i);
-        const Any path = QvFile::joinPath(folder_, name);
+        const Any path = inFolder(folder_, name);
         const long long former = before[static_cast<std::size_t>(i)];
         const long long now = isRegular(path) ? QvFile::flength(path) : -1;
         if (now != former || now < 1) {
@@ -126,7 +135,7 @@ void QvWatchFolderInput::_addEligibleFiles(const AnyVector& names) {
 // --- The queue.
 
 Any QvWatchFolderInput::nextFile() const {
-    if (opened_ && !queue_.empty()) return QvFile::joinPath(folder_, queue_.front());
+    if (opened_ && !queue_.empty()) return inFolder(folder_, queue_.front());
     qv_log()->error("%s", opened_ ? "QvWatchFolderInput::nextFile, no files in que"
                                   : "QvWatchFolderInput::nextFile, not opened");
     return Any();
@@ -144,17 +153,16 @@ int QvWatchFolderInput::fileProcessed() {
     // By the name, while the keys are digests: the entry stays, and so a file that comes back under its name
     // is not taken again.
     queued_.remove(shown(name).c_str());
-    if (const int result = _postprocess(QvFile::joinPath(folder_, name)); result != QvStatus::ok)
-        return result;
+    if (const int result = _postprocess(inFolder(folder_, name)); result != QvStatus::ok) return result;
     return _scan();
 }
 
 int QvWatchFolderInput::_postprocess(const Any& path) {
-    const Any name = QvFile::getFilename(path);
+    const Any name = nameOf(path);
     switch (mode_) {
         case keep: processed_.set(keyOf(name).c_str(), name); return QvStatus::ok;
         case move:
-            if (QvFile::mv(path, QvFile::joinPath(moveTo_, name), true) == 0) return QvStatus::ok;
+            if (QvFile::mv(path, inFolder(moveTo_, name), true) == 0) return QvStatus::ok;
             qv_log()->error("QvWatchFolderInput::_postprocess, can not move %s to %s.", shown(path).c_str(),
                             shown(moveTo_).c_str());
             return QvStatus::postProcessFailed;

@@ -57,6 +57,15 @@ const char* unusable(const Any& output, const Any& input, const std::vector<std:
     return nullptr;
 }
 
+// An input's name without its folder. A backslash, a letter here, would make it the name of what follows, and
+// its output that of another file.
+Any nameToMake(const Any& file) {
+    const std::string path = qv_os_name(file);
+    std::string name = path.substr(path.rfind('/') + 1);
+    std::replace(name.begin(), name.end(), '\\', '_');
+    return qv_any_name(name, file);
+}
+
 }  // namespace
 
 int QvWatchProcessor::process(QvWatchFolderInput& input, const QvWatchTask& task, int) {
@@ -85,7 +94,7 @@ int QvWatchProcessor::nameOutput(QvEncodePipe& pipe, const QvWatchTask& task, in
                                  const Any& inputFile) {
     Any extension;
     pipe.getParam("extension", extension);
-    return pipe.setFilename(task.outputFilename(target, inputFile, extension.asString("")));
+    return pipe.setFilename(task.outputFilename(target, nameToMake(inputFile), extension.asString("")));
 }
 
 // What is thrown fails one target alone.

@@ -55,7 +55,8 @@ QvWatchTask::QvWatchTask(const QvPresetList& presets) : QvPresetList(presets) {}
 Any QvWatchTask::_targetFolder(int target) const {
     const AnyDict& settings = targetOf(*this, target);
     const Any& folder = settings.get("outputFolder");
-    if (!folder.isText() || settings.get("presetSubfolder").isFalse()) return folder;
+    if (!folder.isText() || qv_os_name(folder).empty()) return Any();  // not where the process happens to be
+    if (settings.get("presetSubfolder").isFalse()) return folder;
     return QvFile::joinPath(folder, Any(folderName(preset(target)).c_str()));
 }
 

@@ -227,6 +227,34 @@ TEST_F(BatchFile, ThatCanNotBeWrittenStaysAsItWas) {
     EXPECT_EQ(namesOf(read), "abcdefgh");
 }
 
+TEST_F(BatchFile, IsOnTheDiscBeforeItReplacesAnother) {
+    struct Disc : QvPlatform {
+        int sync(std::FILE* file) override {
+            steps += "sync ";
+            return fails ? -1 : QvPlatform::sync(file);
+        }
+        int moveFile(const char* from, const char* to, bool replace) override {
+            steps += "move ";
+            return QvPlatform::moveFile(from, to, replace);
+        }
+        std::string steps;
+        bool fails = false;
+    } disc;
+    const std::string name = folder_.file("list.xml");
+    ASSERT_EQ(listOf("old").save(narrow(name)), 0);
+    {
+        const PlatformScope scope(disc);
+        EXPECT_EQ(listOf("ab").save(narrow(name)), 0);
+        EXPECT_EQ(disc.steps, "sync move ");
+        disc.fails = true;
+        EXPECT_EQ(listOf("never").save(narrow(name)), -1);
+    }
+    QvBatchList read;
+    EXPECT_EQ(read.load(narrow(name)), 0);
+    EXPECT_EQ(namesOf(read), "ab");
+    EXPECT_EQ(std::distance(std::filesystem::directory_iterator(folder_.path()), {}), 1) << "litter";
+}
+
 TEST_F(BatchFile, SubstitutesEncodersThatAreMissing) {
     const auto codecsOf = [](const QvBatchList& list) {
         std::string names;

@@ -2,10 +2,17 @@
 
 #include <sys/stat.h>
 
+#include <atomic>
 #include <set>
 #include <thread>
 
+#include "builtin/decoders/wavdec.h"
+#include "core/engine/modules/builtinplugin_p.h"
+#include "core/engine/modules/qvmodule.h"
+#include "core/engine/modules/qvplugin.h"
+#include "core/engine/modules/qvregistry.h"
 #include "core/engine/threads/qvthreads.h"
+#include "core/preset/qvpresetmgr.h"
 #include "tests/core/batch/batch_fixture.h"
 
 class QvBatchProcessorTest : public BatchTest {
@@ -132,7 +139,12 @@ TEST_F(QvBatchProcessorTest, DamagedTasksFailAlone) {
     };
     collect(Any(static_cast<const AnyDict&>(sound)), "");
     ASSERT_GT(paths.size(), 40u);
-    const Any wrong[] = {Any(),          Any(-7), Any("wrong"), Any(AnyVector()), Any(AnyDict("name", 3)),
+    // A text is taken for the name of the output too.
+    const Any wrong[] = {Any(),
+                         Any(-7),
+                         Any(folder_.file("wrong").c_str()),
+                         Any(AnyVector()),
+                         Any(AnyDict("name", 3)),
                          Any(Pair(9, 9))};
     for (const std::string& path : paths)
         for (const Any& value : wrong) {
@@ -192,6 +204,48 @@ TEST_F(QvBatchProcessorTest, ADamagedTaskSaysWhere) {
     runAll();
     for (std::size_t i = 0; i < std::size(damages); ++i) EXPECT_EQ(message(i), damages[i].message);
     EXPECT_EQ(processor_.errorCode(), -13);
+}
+
+namespace {
+
+// Sound files whose decoder notes when a run asks whether their data can be passed on as they are.
+class AskedWav : public WavDec {
+  public:
+    static inline std::atomic<int> asked{0};
+    using WavDec::getParam;
+    void getParam(const char* name, Any& value) const override {
+        if (std::string(name) == "srParams") ++asked;
+        WavDec::getParam(name, value);
+    }
+};
+
+struct AskedWavModule : QvModule {
+    AskedWavModule() : QvModule(QvModuleType::decoder, "wavdec", "notes questions", "WAV") {}
+    QvCodec* create() override { return _setAttrs(new AskedWav); }
+};
+
+}  // namespace
+
+TEST_F(QvBatchProcessorTest, SmartRenderingIsAWishForTheTasksThatFollow) {
+    qv_registry()->cleanup();
+    QvPlugin plugin("asked", "A decoder in front of the built-in one");
+    plugin.addModule(new AskedWavModule);
+    qv_registry()->addPlugin(&plugin);
+    qv_registry()->addPlugin(qvBuiltinPlugin());
+    qvPresetMgr()->update();
+    const AnyDict file =
+        entry(wav_.getString("filename"), AnyDict("name", "wavdec", "filename", wav_.get("filename")));
+    for (const char* name : {"out0.x", "out1.x", "out2.x"}) list_.append(task(name, {file}));
+    processor_.init(list_);
+    std::vector<int> asked;
+    notes_.hook = [&](const std::string& text) {
+        if (text == "done0:0") processor_.setSmartRender(true);
+        if (text == "done1:0") processor_.setSmartRender(false);
+        if (text.rfind("done", 0) == 0) asked.push_back(AskedWav::asked.exchange(0));
+    };
+    EXPECT_EQ(processor_.start(true, &notes_), 0);
+    EXPECT_EQ(asked, (std::vector<int>{0, 1, 0})) << notes_.all();
+    qv_registry()->cleanup();
 }
 
 // --- Stop and pause.
@@ -266,6 +320,24 @@ TEST_F(QvBatchProcessorTest, LongVideosReportEveryHundredFrames) {
     EXPECT_DOUBLE_EQ(notes_.progressed.at(3), 0.25);
     EXPECT_EQ(reports(1000, 40), 100);
     EXPECT_EQ(reports(1200, 16), 100) << "only the part that is taken counts";
+}
+
+TEST_F(QvBatchProcessorTest, TheLengthOfJoinedVideosCountsAsAWhole) {
+    QvTaskState joined;
+    joined.set("encoder", output(0));
+    joined.setOutputFilename(folder_.file("out0.x").c_str());
+    joined.set("streams", AnyVector(AnyDict("type", 1)));
+    joined.set("segments", AnyVector());
+    for (const char* name : {"a.yuv", "b.yuv"}) {
+        const AnyDict file = film(name, 600, 0, QvFramerate::f25p(), width, height);
+        joined.addSegment(AnyVector(source(1, file)), AnyVector(file));
+    }
+    list_.append(joined);
+    processor_.init(list_);
+    EXPECT_EQ(processor_.start(true, &notes_), 0);
+    EXPECT_EQ(notes_.progressed.size(), 12u);
+    EXPECT_EQ(notes_.take(),
+              "begin task0 init0.0:0 init0.1:0 seg0.0 segdone0.0:0 seg0.1 segdone0.1:0 done0:0 end");
 }
 
 TEST_F(QvBatchProcessorTest, APauseWithinATaskHoldsIt) {

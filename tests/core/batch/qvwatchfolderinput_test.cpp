@@ -160,6 +160,19 @@ TEST_F(QvWatchFolderInputTest, ReportsFilesThatItCanNotPutAway) {
                              QvLogMask::error));
 }
 
+TEST_F(QvWatchFolderInputTest, AssertsAnUnknownModeAndLeavesTheFile) {
+    write("a");
+    for (const int mode : {0, 4, -1}) {
+        ASSERT_EQ(open(mode), 0) << mode;
+        EXPECT_EQ(input_.nrFiles(), 1);
+        EXPECT_THROW(input_.fileProcessed(), QvAssertFailure) << mode;
+        EXPECT_EQ(input_.nrFiles(), 0) << "it is not tried again";
+        EXPECT_EQ(input_.scan(), 0);
+        EXPECT_EQ(input_.nrFiles(), 0);
+        EXPECT_EQ(TempFolder::read(inside("a")), "x");
+    }
+}
+
 TEST_F(QvWatchFolderInputTest, PassesOverWhatIsNoFile) {
     const std::string bytes = "\xFF\xFE name", quoted = "a \"b\" %s\n<c>",
                       digest = "b975c10ca8b6f1c0e299c33161267769";
@@ -188,6 +201,26 @@ TEST_F(QvWatchFolderInputTest, PassesOverWhatIsNoFile) {
     EXPECT_TRUE(input_.nextFile().isWString());
     while (input_.nrFiles() > 0) EXPECT_EQ(input_.fileProcessed(), 0);
     EXPECT_FALSE(fs::exists(inside(bytes)));
+}
+
+// Other systems' separators are letters here.
+TEST_F(QvWatchFolderInputTest, TakesNamesWithBackslashesAsTheyAre) {
+    const Texts names{"a\\b", "b", "c\\", "d:\\..\\b", "\\\\host\\b"};
+    for (const int mode :
+         {QvWatchFolderInput::keep, QvWatchFolderInput::move, QvWatchFolderInput::deleteFiles}) {
+        for (const std::string& name : names) write(name, name);
+        ASSERT_EQ(open(mode), 0);
+        Texts found = drain(), expected = names;
+        std::sort(found.begin(), found.end());
+        std::sort(expected.begin(), expected.end());
+        EXPECT_EQ(found, expected) << mode;
+        for (const std::string& name : names) {
+            EXPECT_EQ(fs::exists(inside(name)), mode == QvWatchFolderInput::keep) << name;
+            if (mode == QvWatchFolderInput::move) {
+                EXPECT_EQ(TempFolder::read(folder_.file("done/" + name)), name);
+            }
+        }
+    }
 }
 
 TEST_F(QvWatchFolderInputTest, LeavesFilesThatItMayNotRead) {
@@ -226,8 +259,6 @@ TEST_F(QvWatchFolderInputTest, RefusesWhatItCanNotWatch) {
         {&number, 1, nullptr, -9, "QvWatchFolderInput::open,  is not folder."},
         {&folder, 2, nullptr, -13, move},
         {&folder, 2, &number, -13, move},
-        {&folder, 0, nullptr, -13, "QvWatchFolderInput::open, unknown mode 0."},
-        {&folder, 4, nullptr, -13, "QvWatchFolderInput::open, unknown mode 4."},
         {&folder, 2, &below, 0,
          "QvWatchFolderInput::open, can not create 'move to' folder " + folder_.file("file/below") + "."},
     };

@@ -107,6 +107,14 @@ TEST_F(QvWatchProcessorTest, MakesEveryTargetOfEveryFile) {
     EXPECT_EQ(process(taskOf({})), 0) << "no target is no failure";
 }
 
+TEST_F(QvWatchProcessorTest, BackslashesInANameMakeNoOtherName) {
+    wav("b.wav", 1);
+    wav("a\\b.wav", 2);
+    EXPECT_EQ(process(taskOf({avi("out")}), QvWatchFolderInput::deleteFiles), 0);
+    EXPECT_EQ(filesIn("out"), (Texts{"a_b.avi", "b.avi"}));
+    EXPECT_EQ(filesIn("in"), Texts{});
+}
+
 TEST_F(QvWatchProcessorTest, ATargetThatCanNotBeMadeFailsAlone) {
     wav("a.wav", 1);
     QvPreset unknown(0x2FFFFFF, "Nothing");
@@ -151,7 +159,8 @@ TEST_F(QvWatchProcessorTest, WithoutItsFoldersNothingBegins) {
     EXPECT_EQ(process(taskOf({raw("out"), raw("file/below")})), -1);
     EXPECT_TRUE(log.contains("Can not create folder " + folder_.file("file/below"), QvLogMask::error));
     EXPECT_EQ(input_.nrFiles(), 1);
-    for (const AnyDict& broken : {AnyDict(), AnyDict("__target__", 5)}) {
+    for (const AnyDict& broken :
+         {AnyDict(), AnyDict("__target__", 5), AnyDict("__target__", AnyDict("outputFolder", ""))}) {
         const QvWatchTask task = taskOf({broken});
         EXPECT_EQ(task.createOutputFolders(), -1);
     }
@@ -174,6 +183,23 @@ TEST_F(QvWatchProcessorTest, ThrowingTargetsFailAlone) {
     EXPECT_EQ(filesIn("z"), Texts{"a.avi"});
 }
 
+// An encoder takes none of the input's streams: nothing would be in the output.
+TEST_F(QvWatchProcessorTest, ATargetWithoutStreamsFails) {
+    struct Silent : QvWatchProcessor {
+        int nameOutput(QvEncodePipe& pipe, const QvWatchTask& task, int target, const Any& file) override {
+            if (target == 0) pipe.clearStreams();
+            return QvWatchProcessor::nameOutput(pipe, task, target, file);
+        }
+    } processor;
+    wav("a.wav", 1);
+    ASSERT_EQ(input_.open(narrow(folder_.file("in")), QvWatchFolderInput::keep), 0);
+    LogCapture log;
+    EXPECT_EQ(processor.process(input_, taskOf({avi("x"), avi("z")})), -1);
+    EXPECT_TRUE(log.contains("transcoded 1 files, failed 1 files"));
+    EXPECT_EQ(filesIn("x"), Texts{});
+    EXPECT_EQ(filesIn("z"), Texts{"a.avi"});
+}
+
 TEST_F(QvWatchProcessorTest, NamesOutputs) {
     QvPreset odd(QvProfile::raw, "x/..\\y");
     QvPreset dots(QvProfile::raw, "..");
@@ -183,6 +209,7 @@ TEST_F(QvWatchProcessorTest, NamesOutputs) {
     EXPECT_EQ(task.outputFilename(1, narrow("/in/a"), "mov"), narrow(folder_.file("out/Raw/a.mov")));
     EXPECT_EQ(task.outputFilename(2, narrow("a.wav"), "mov"), narrow("/o/x_.._y/a.mov"));
     EXPECT_EQ(task.outputFilename(3, narrow("a.wav"), "mov"), narrow("/o/_../a.mov"));
+    EXPECT_EQ(task.outputFilename(0, narrow("C:\\in\\a.wav"), "mov"), narrow(folder_.file("out/a.mov")));
     EXPECT_TRUE(task.outputFilename(0, wide("/in/\xC3\xA4.wav"), "mov").isWString());
     EXPECT_THROW(task.outputFilename(4, narrow("a"), "b"), QvAssertFailure);
 }
