@@ -148,4 +148,18 @@ TEST(Messages, ErrorsOfTheSystemHaveACauseAndARemedy) {
                  "can't write 'x': the size is odd; choose another name or format");
 }
 
+// What a terminal would act on, and bytes that are no text, are shown as numbers; letters of any script stay.
+TEST(Quotes, NamesCanNotWriteOverTheLine) {
+    const std::pair<const char*, const char*> rows[] = {
+        {"a\nb\x7F", "'a\\x0ab\\x7f'"},
+        {"\xC2\x9B\x31m", "'\\xc2\\x9b1m'"},  // CSI in one character
+        {"\xE2\x80\xAE"
+         "gpj",
+         "'\\xe2\\x80\\xaegpj'"},  // the direction turned round
+        {"\xFF\xC3", "'\\xff\\xc3'"},
+        {"\xC3\xA4\xE6\x97\xA5\xEF\xBF\xBD", "'\xC3\xA4\xE6\x97\xA5\xEF\xBF\xBD'"},
+    };
+    for (const auto& [text, shown] : rows) EXPECT_EQ(inQuotes(text), shown);
+}
+
 }  // namespace
