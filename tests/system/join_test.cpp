@@ -140,6 +140,20 @@ TEST_F(Join, WhatASegmentLacksIsBlackOrSilent) {
     EXPECT_EQ(heard[begin + 4410], 0);
 }
 
+TEST_F(Join, ClippingIsCountedOverTheSegments) {
+    std::string samples;
+    for (int i = 0; i < 48000; ++i) {
+        const float value = i % 4 == 0 ? 2.0F : 0.1F;
+        samples.append(reinterpret_cast<const char*>(&value), sizeof value);
+    }
+    folder.write("loud.wav", riff(wavChunk("fmt ", wavFormat(3, 1, 48000, 32)) + wavChunk("data", samples)));
+    for (const char* third : {"0-0.25", "0.5-0.75"}) {  // read again, and the rest of what was read before
+        const auto result = works({"transcode", "loud.wav", "--cut", "0.25-0.5", "--cut", "0.75-1", "--cut",
+                                   third, "-o", "o.wav", "-y"});
+        EXPECT_THAT(result.err, HasSubstr("9000 samples of audio stream 0 were clipped"));
+    }
+}
+
 TEST_F(Join, OthersAreConvertedToTheFirst) {
     const std::string other = "testgen:size=64x48,rate=25,duration=2";
     works(Words{"transcode", "--join", "p.yuv+s.wav@0f-10f", other + "@0.5-1.5", "-o", "o.yuv"} + kRaw);

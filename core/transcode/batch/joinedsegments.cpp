@@ -101,6 +101,13 @@ int JoinedSegments::frameTotal(int stream) const {
     return static_cast<int>(std::min<long long>(total, std::numeric_limits<int>::max()));
 }
 
+long long JoinedSegments::clippedSamples(int stream) const {
+    long long total = 0;
+    for (const BatchSegment& segment : segments)
+        if (inRange(stream, segment.audios)) total += at(segment.audios, stream)->clipped();
+    return total;
+}
+
 long long JoinedSegments::sampleTotal(int stream) const {
     long long total = 0;
     for (const BatchSegment& segment : segments)

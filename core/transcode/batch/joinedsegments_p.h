@@ -56,8 +56,9 @@ class JoinedSegments {
     AnyVector storedFiles() const;
     AnyVector storedSources(const Pair& address) const;
     bool smartParams(const Pair& address, AnyDict& out) const;
-    int frameTotal(int stream) const;         // at any time
-    long long sampleTotal(int stream) const;  // of the sources' sound
+    int frameTotal(int stream) const;            // at any time
+    long long clippedSamples(int stream) const;  // beyond full scale, of those that were read
+    long long sampleTotal(int stream) const;     // of the sources' sound
     // What reads give: where there is a picture, sound lasts as long as it does.
     long long soundTotal(int stream) const;
 

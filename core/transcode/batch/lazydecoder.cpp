@@ -227,10 +227,10 @@ void LazyDecoder::getStreamParam(int type, int stream, const char* name, Any& va
     const std::string key = std::to_string(type) + "/" + std::to_string(stream) + "/" + name;
     auto& answers = source_->facts->answers;
     auto answered = answers.find(key);
-    if (answered == answers.end()) {
+    if (answered == answers.end() || isAwake()) {  // counts change while it is read
         Any answer;
         mustBeAwake().getStreamParam(type, stream, name, answer);
-        answered = answers.emplace(key, answer).first;
+        answered = answers.insert_or_assign(key, answer).first;
     }
     value = answered->second;
 }
@@ -351,6 +351,10 @@ QvPcm* LazyDecoder::getAudioPtr(int stream) {
 // --- What only the source can do.
 
 int LazyDecoder::setParam(const char* name, const Any& value) {
+    if (std::strcmp(name, "clipRange") == 0) {  // of the next reads alone, so it need not stay open for this
+        QvDecodePipe* decoder = awake();
+        return decoder ? decoder->setParam(name, value) : refuse();
+    }
     return copyError(forGood().setParam(name, value));
 }
 

@@ -180,6 +180,10 @@ int QvBatchDecoder::nrStreams(int type) const {
 }
 
 void QvBatchDecoder::getStreamParam(int type, int stream, const char* name, Any& value) const {
+    if (type == qvAudioStream && inRange(stream, p_->audioJobs) && std::strcmp(name, "clippedSamples") == 0) {
+        value = p_->clippedSamples(stream);
+        return;
+    }
     AnyDict params;
     getStreamParams(type, stream, params);
     if (params.isSet(name)) value = params.get(name);

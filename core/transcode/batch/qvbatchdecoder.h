@@ -12,7 +12,8 @@
 // "samples" what reads give. After the last segment every read gives -4 (QvStatus::endOfStream).
 //
 // The parameter "endedEarly" is a Vector of the names of inputs whose sound ended before they said it does;
-// what they lack was filled with silence.
+// what they lack was filled with silence. "clippedSamples" of an audio stream counts what its sources have
+// met beyond full scale.
 //
 // A task that is stored has the inputs in the place of this decoder: "segmentFiles" is the Vector of the
 // entries of a state's "files", each once. "segmentSources", asked with a Pair of type and stream in the

@@ -115,8 +115,8 @@ int SegmentAudio::openPipe(std::string& why) {
 }
 
 int SegmentAudio::start(bool bounded, std::string& why) {
-    ended_ = false;
-    samplesRead_ = 0;
+    ended_ = counting_ = false;
+    samplesRead_ = clipped_ = 0;
     if (!measured_) pipe_.reset();
     started_ = true;
     QvDecodePipe& decoder = *input_.decoder;
@@ -130,10 +130,10 @@ int SegmentAudio::start(bool bounded, std::string& why) {
     const int result = nothing ? QvStatus::endOfStream : decoder.seek(from, qvAudioStream, input_.number);
     ended_ = result == QvStatus::endOfStream;
     if (result != QvStatus::ok && !ended_) return failedWith(result, decoder, why);
-    const long long first = from.position(samplerate_);
-    const long long end = (span_.out + delay_).position(samplerate_);
-    sound_.setAvailable(decoder.nrSamples(input_.number) - first);
-    sound_.setLeft(bounded ? std::max(end - first, 0LL) : BoundedSound::unbounded);
+    first_ = from.position(samplerate_);
+    end_ = std::max((span_.out + delay_).position(samplerate_), first_);
+    sound_.setAvailable(decoder.nrSamples(input_.number) - first_);
+    sound_.setLeft(bounded ? end_ - first_ : BoundedSound::unbounded);
     if (!converts_ || ended_) return QvStatus::ok;
     if (pipe_)
         pipe_->close();
@@ -143,6 +143,7 @@ int SegmentAudio::start(bool bounded, std::string& why) {
 }
 
 int SegmentAudio::read(int n, QvPcm& to, std::string& why) {
+    if (!counting_) countClipping();
     int result = pipe_ ? pipe_->process(&sound_, input_.number, n) : sound_.readSamples(n, input_.number);
     if (result < 0 && result != QvStatus::endOfStream)
         return pipe_ ? failedWith(result, *pipe_, why) : failedWith(result, sound_, why);
@@ -153,6 +154,19 @@ int SegmentAudio::read(int n, QvPcm& to, std::string& why) {
     result = append(*from, held, to, why);
     if (pipe_) pipe_->erase(held);
     return result;
+}
+
+// Other segments may have read the same part of the source, and its count begins with 0 here.
+void SegmentAudio::countClipping() {
+    counting_ = true;
+    try {
+        input_.decoder->setParam("clipRange", AnyVector(Any(first_), Any(end_)));
+    } catch (const QvParamException&) {  // it clips nothing
+    }
+}
+
+long long SegmentAudio::clipped() const {
+    return counting_ ? input_.decoder->getAudioParam(input_.number, "clippedSamples").asInt64(0) : clipped_;
 }
 
 int SegmentAudio::append(const QvPcm& from, int n, QvPcm& to, std::string& why) const {
@@ -175,6 +189,8 @@ int SegmentAudio::stop(std::string& why) {
         if (result != QvStatus::ok) why = pipe_->errorDesc();
         if (!measured_) pipe_.reset();
     }
+    clipped_ = clipped();
+    counting_ = false;
     input_.decoder->deselect(qvAudioStream, input_.number);
     return result;
 }

@@ -36,6 +36,8 @@ class SegmentAudio {
     bool endedEarly() const { return sound_.endedEarly(); }
     void end() { ended_ = true; }
     long long samplesRead() const { return samplesRead_; }  // since start, silence included
+    // Samples beyond full scale that the source has met since start.
+    long long clipped() const;
     void count(int samples) { samplesRead_ += samples; }
 
   private:
@@ -43,6 +45,7 @@ class SegmentAudio {
     int build(std::string& why);
     int openPipe(std::string& why);
     int append(const QvPcm& from, int n, QvPcm& to, std::string& why) const;
+    void countClipping();
 
     QvIStream input_;
     AudioJobDescription job_;
@@ -56,4 +59,7 @@ class SegmentAudio {
     MediaTime delay_;        // what is skipped at the start of the input
     bool ended_ = false;
     long long samplesRead_ = 0;
+    long long first_ = 0, end_ = 0;  // of the source's samples, those that are taken
+    bool counting_ = false;          // from the first read on: before it the source need not be open
+    long long clipped_ = 0;          // when counting ended
 };
