@@ -186,7 +186,7 @@ std::string presetText(const QvPreset& preset) {
     text += "muxers   " + listOf(wordsOf(checked.muxers())) + "\n";
     if (!checked.isCustom()) return text;
     addSettings("muxer    ", checked.get("muxer"), text);
-    for (const Any& stream : checked.getVector("streams", AnyVector()))
+    for (const Any& stream : checked.getVector("streams"))
         if (stream.isDict())
             addSettings(titleOf(stream.asDict().getInt32("type", -1)), stream.asDict().get("codec"), text);
     return text;

@@ -30,19 +30,6 @@ QvIStreamList fedStreams(const QvInputSegment& segment) {
     return list;
 }
 
-// Decoders that find no place in the list are deleted, as nobody else knows them.
-void keepAll(QvDPipeList& list, const QvDPipeList& decoders) {
-    int kept = 0;
-    Undo deleting([&] {
-        for (int i = kept; i < decoders.size(); ++i) delete decoders[i];
-    });
-    for (QvDecodePipe* decoder : decoders) {
-        list.append(decoder);
-        ++kept;
-    }
-    deleting.dismiss();
-}
-
 }  // namespace
 
 QvBatchTask::QvBatchTask() = default;
@@ -98,9 +85,19 @@ int QvBatchTask::openFiles(const QvTaskState& state, int options, QvFileOpenCb* 
             continue;
         }
         std::string error;
+        // Until they stand in the list nobody else knows the decoders.
+        int kept = 0;
+        Undo closing([&] {
+            for (; kept > 0; --kept) segment.decoders.remove(0);
+            segment.decoders.deleteAll();
+        });
         const int result = inputs.open(i, segment, error);
         if (result == QvStatus::ok) {
-            keepAll(opened, segment.decoders);
+            for (QvDecodePipe* decoder : segment.decoders) {
+                opened.append(decoder);
+                ++kept;
+            }
+            closing.dismiss();
             segment.status = QvInputSegment::opened;
             ++open;
             continue;
@@ -109,6 +106,7 @@ int QvBatchTask::openFiles(const QvTaskState& state, int options, QvFileOpenCb* 
         qv_dbg()->error("[Task] Cannot add input segment %d", i);
         segment.streams.clear();
         segment.decoders.deleteAll();
+        closing.dismiss();
         if (!(options & everySegmentOpens)) continue;
         segments_.clear();
         opened.deleteAll();
