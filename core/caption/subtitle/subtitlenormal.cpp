@@ -169,7 +169,10 @@ NormalText normalSrt(View text) {
             open = false;
         }
         if (!open || trimmed(lines[i]).empty() || (before && isNumber(lines[i]))) continue;
-        entries.back().text += withSimpleMarkup(lines[i], subViewer) + "\n";
+        const std::string shown = withSimpleMarkup(lines[i], subViewer);
+        // A break at the end of a line makes an empty one, at which the parser would end the entry.
+        for (const View line : linesOf(shown))
+            if (!trimmed(line).empty()) entries.back().text += std::string(line) + "\n";
     }
     sortByStart(entries);
     for (const Entry& entry : entries)
