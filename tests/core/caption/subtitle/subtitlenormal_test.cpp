@@ -34,6 +34,14 @@ struct Normal : testing::Test {
     QvSubtitleFindings found;
 };
 
+TEST_F(Normal, ABreakAtTheEndOfALineDoesNotEndTheEntry) {
+    EXPECT_EQ(read("b.srt",
+                   "1\n00:00:01,000 --> 00:00:02,000\none<br>\ntwo\n\n"
+                   "2\n00:00:03,000 --> 00:00:04,000\nlast\n"),
+              (std::vector<Shown>{{1000, 2000, "one|two"}, {3000, 4000, "last"}}));
+    EXPECT_EQ(found.lost, 0);
+}
+
 TEST_F(Normal, TimesAsPeopleWriteThem) {
     const struct {
         const char* line;
