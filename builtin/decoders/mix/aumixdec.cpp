@@ -124,8 +124,8 @@ int AudioMixDec::open() {
         QV_FAIL(errorDesc());
     }
     const MixNesting nesting(filename_);
-    const auto failed = [this](int code) {
-        MixNesting::noteFailure(inputFailure_);
+    const auto failed = [this, &nesting](int code) {
+        nesting.failed(inputFailure_);
         return code;
     };
     if (!nesting.fault().empty()) {

@@ -1,40 +1,33 @@
 #include "builtin/decoders/mix/mixnesting.h"
 
 #include <utility>
-#include <vector>
 
 #include "core/engine/files/qvfileutil.h"
 
-namespace {
+thread_local MixNesting* MixNesting::innermost_ = nullptr;
 
-struct Opening {
-    std::vector<Any> files;
-    int inputs = 0;
-    std::string failure;
-};
-
-Opening& opening() {
-    thread_local Opening current;
-    return current;
-}
-
-}  // namespace
-
-MixNesting::MixNesting(const Any& file) {
-    Opening& now = opening();
-    if (now.files.empty()) now = Opening();
-    for (const Any& outer : now.files)
-        if (fault_.empty() && outer.isValid() && file.isValid() && QvFile::isSameFile(outer, file))
+MixNesting::MixNesting(const Any& file) : file_(file) {
+    int depth = 0;
+    for (const MixNesting* mix = outer_; mix; mix = mix->outer_, ++depth)
+        if (fault_.empty() && mix->file_.isValid() && file.isValid() && QvFile::isSameFile(mix->file_, file))
             fault_ = "it is an input of itself";
-    if (fault_.empty() && now.files.size() >= maxDepth)
+    if (fault_.empty() && depth >= maxDepth)
         fault_ = "more than " + std::to_string(maxDepth) + " metafiles inside one another";
-    now.files.push_back(file);
+    innermost_ = this;
 }
 
-MixNesting::~MixNesting() { opening().files.pop_back(); }
+MixNesting::~MixNesting() { innermost_ = outer_; }
 
-bool MixNesting::addInput() { return ++opening().inputs <= maxInputs; }
+bool MixNesting::addInput() {
+    MixNesting* outermost = innermost_;
+    while (outermost && outermost->outer_) outermost = outermost->outer_;
+    return !outermost || ++outermost->inputs_ <= maxInputs;
+}
 
-void MixNesting::noteFailure(const std::string& text) { opening().failure = text; }
+void MixNesting::failed(const std::string& text) const {
+    if (outer_) outer_->innerFailure_ = text;
+}
 
-std::string MixNesting::takeFailure() { return std::exchange(opening().failure, {}); }
+std::string MixNesting::takeFailure() {
+    return innermost_ ? std::exchange(innermost_->innerFailure_, {}) : std::string();
+}

@@ -19,13 +19,22 @@ class MixNesting {
 
     // Why this one can't be opened; empty if it can.
     const std::string& fault() const { return fault_; }
-    // Counts an input. False if there are too many.
+    // Counts an input of the mix that this thread is opening. False if there are too many.
     static bool addInput();
 
-    // Why the last mix that was opened as an input failed, for the one that names it; empty if none did.
-    static void noteFailure(const std::string& text);
+    // Says to the mix that names this one why it can't be opened.
+    void failed(const std::string& text) const;
+    // Why the last input of the mix that this thread is opening failed, where that is a mix; else empty.
     static std::string takeFailure();
 
   private:
+    // A chain on the stacks of the calls. A container of the thread would take memory when the thread first
+    // uses it, and where there is none the C library ends the process.
+    static thread_local MixNesting* innermost_;
+
+    MixNesting* const outer_ = innermost_;
+    const Any file_;
+    int inputs_ = 0;  // of the outermost one
     std::string fault_;
+    std::string innerFailure_;
 };
