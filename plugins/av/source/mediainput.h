@@ -1,0 +1,81 @@
+// A film's bytes, and a demultiplexer over them.
+//
+// Every reader of a stream has a demultiplexer of its own, so that streams are read and sought independently.
+// Bytes come through the engine's byte sources only: no protocol of the library is open, and a document that
+// names other files opens none of them.
+#pragma once
+
+#include <cstdint>
+#include <memory>
+#include <string>
+
+#include "core/stream/qvbytesource.h"
+#include "core/value/any.h"
+
+struct AVFormatContext;
+struct AVPacket;
+
+namespace av {
+
+// Where the bytes are: a file, or a source that the application has. Outlives the inputs that are made of it.
+class MediaBytes {
+  public:
+    explicit MediaBytes(const Any& filename);
+    // The source is borrowed. Its readers share it: each has a position of its own and seeks before it reads.
+    MediaBytes(QvByteSource& source, const Any& name);
+
+    // A reader from the first byte. Null with `reason`, a part of a sentence, if it can't be opened.
+    std::unique_ptr<QvByteSource> open(std::string& reason) const;
+    const Any& name() const { return name_; }  // for messages, and for its extension
+    bool seekable() const;                     // false for a pipe: one reader only, from its start to its end
+
+  private:
+    Any name_;
+    QvByteSource* source_ = nullptr;
+};
+
+// What tells packets of one stream apart; see PacketIndex.
+struct PacketKey {
+    std::int64_t pts, dts;  // in the stream's time base; AV_NOPTS_VALUE where the container has none
+    std::int64_t position;  // byte in the file; -1 where the container doesn't say
+};
+
+class MediaInput {
+  public:
+    // Opens and probes. `format` is the name of a container that the library must use; "" finds it out.
+    // Null with `reason`, a part of a sentence, for what is none of the containers that are allowed, is
+    // beyond the limits (source/limits.h), encrypted, or has no stream.
+    static std::unique_ptr<MediaInput> open(const MediaBytes& bytes, const std::string& format,
+                                            std::string& reason);
+    ~MediaInput();
+    MediaInput(const MediaInput&) = delete;
+    MediaInput& operator=(const MediaInput&) = delete;
+
+    AVFormatContext& context() { return *context_; }
+    const AVFormatContext& context() const { return *context_; }
+
+    // From here on only packets of this stream are delivered; others are skipped where the container can, and
+    // are never decoded. -1: of all streams.
+    void selectOnly(int stream);
+
+    enum class Read { packet, end, failed };
+    // The next packet, to be unreferenced by the caller. After `failed`, failure() is the reason.
+    Read read(AVPacket& packet);
+    const std::string& failure() const { return failure_; }
+
+    // The next packet that read() delivers of this stream is this one. Where the container's own seek misses
+    // it, the file is read from an earlier place until it comes. False with failure(): it did not come.
+    bool seekTo(int stream, const PacketKey& packet);
+    bool rewind();
+
+  private:
+    struct Bytes;
+    std::unique_ptr<Bytes> bytes_;
+    AVFormatContext* context_ = nullptr;
+    int only_ = -1;
+    std::string failure_;
+
+    MediaInput() = default;
+};
+
+}  // namespace av
