@@ -36,6 +36,6 @@ TimeRange parseRange(const std::string& text, const std::string& option) {
 
 SegmentWords parseSegment(const std::string& word) {
     const size_t at = exists(word) ? std::string::npos : word.rfind('@');
-    if (at == std::string::npos || !looksLikeRange(word.substr(at + 1))) return {namesIn(word), {}};
-    return {namesIn(word.substr(0, at)), parseRange(word.substr(at + 1), word)};
+    if (at == std::string::npos || !looksLikeRange(word.substr(at + 1))) return {namesIn(word), {}, word};
+    return {namesIn(word.substr(0, at)), parseRange(word.substr(at + 1), word), word};
 }

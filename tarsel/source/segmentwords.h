@@ -16,6 +16,7 @@ TimeRange parseRange(const std::string& text, const std::string& option);
 struct SegmentWords {
     std::vector<std::string> inputs;  // read side by side
     TimeRange range;
+    std::string typed;  // for messages
 };
 
 // "NAME[@FROM-TO]", where NAME is that of an input, or several with "+" between them: "a.yuv+a.wav@10-20".

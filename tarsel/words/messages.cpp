@@ -106,10 +106,10 @@ constexpr Message kMessages[] = {
     {Msg::pictureNoPng,      Exit::input, "can't read the picture {file}",          "it is no PNG file",                                     "give a PNG picture"},
     {Msg::pictureDamaged,    Exit::input, "can't read the picture {file}",          "the file is damaged",                                   "copy or make it again"},
     // parts of the input
-    {Msg::toNotAfter,     Exit::usage, "--to {text}",                 "it is not after {text}",                      "give a later --to"},
-    {Msg::fromAfterEnd,   Exit::usage, "--from {text}",               "it is after the end of {file} ({text})",      "give an earlier time"},
+    {Msg::toNotAfter,     Exit::usage, "{option} {text}",             "it is not after {text}",                      "give a later end"},
+    {Msg::fromAfterEnd,   Exit::usage, "{option} {text}",             "it is after the end of {file} ({text})",      "give an earlier time"},
     {Msg::atAfterEnd,     Exit::usage, "--at {text}",                 "it is after the end of {file} ({text})",      "give an earlier time"},
-    {Msg::toAfterEnd,     Exit::done,  "--to {text}",                 "it is after the end of {file} ({text})",      "stopped at the end"},
+    {Msg::toAfterEnd,     Exit::done,  "{option} {text}",             "it is after the end of {file} ({text})",      "stopped at the end"},
     {Msg::durationAfterEnd, Exit::done, "--duration {text}",          "from {text} it is after the end of {file} ({text})", "stopped at the end"},
     {Msg::noFrameBetween, Exit::usage, "can't take a part of {file}", "there is no frame between {text} and {text}", "move --from or --to"},
     {Msg::durationNone,   Exit::usage, "--duration",                  "{name} is no length",                         "give more than 0"},

@@ -79,7 +79,7 @@ TEST_F(Command, TheWholeLine) {
         {{"frame", "testgen", "-o", "x.png", "--sheet", "0x0"},
          "--sheet: '0x0' is not a sheet of pictures; use COLUMNSxROWS from 1x1 to 32x32"},
         {{"transcode", "in.wav", "-o", "x.wav", "--from", "0.9", "--to", "0.1"},
-         "--to 0.1: it is not after --from 0.9; give a later --to"},
+         "--to 0.1: it is not after --from 0.9; give a later end"},
         {{"transcode", "testgen", "--size", "20000x20000", "-o", "x.raw"},
          "--size: a frame of 20000x20000 is too large for the memory or this format; give a smaller size"},
         {{"transcode", "testgen", "--size", "65535x65535", "-o", "x.raw"},

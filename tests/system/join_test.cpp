@@ -308,7 +308,10 @@ TEST_F(Join, WhatCantBeJoinedIsRefusedByName) {
     fails(2, Words{"transcode", "--join", "p.yuv@900f-", "-o", "x.yuv"} + kRaw, {"900f", "'p.yuv'"});
     for (const char* cut : {"x", "1", "-", ""})
         fails(2, {"transcode", "s.wav", "--cut", cut, "-o", "x.wav"}, {"--cut", "FROM-TO"});
-    fails(2, {"transcode", "s.wav", "--cut", "2-1", "-o", "x.wav"}, {"not after"});
+    fails(2, {"transcode", "s.wav", "--cut", "2-1", "-o", "x.wav"},
+          {"--cut 2-1: to 1: it is not after 2; give a later end"});
+    fails(2, {"transcode", "--join", "s.wav@50-60", "-o", "x.wav"},
+          {"s.wav@50-60: from 50: it is after the end of 's.wav'"});
     fails(2, {"transcode", "--join", "-o", "x.wav"}, {"INPUT"});
     fails(4, {"transcode", "--join", "s.wav@0-1", "s.wav@1-2", "-o", "s.wav", "-y"}, {"'s.wav'", "input"});
 }

@@ -198,7 +198,7 @@ JobPlan planJob(const PlanOptions& options, const OutputForm& output, std::vecto
     preset.takeSounds();
     if (!known) checkFit(plan, options);
     if (!known) warnOfUnused(plan, options);
-    planPoints(plan, {options.from, options.to, options.duration});
+    planPoints(plan, {options.from, options.to, options.duration, options.segment});
     sounds.planDelays();
     planEnds(plan, options.shortest, options.longest);
     planFrames(plan);

@@ -28,6 +28,7 @@ struct PlanOptions {
     std::vector<std::string> inputs;
     std::string output, format, muxer, saveTask;
     std::string from, to, duration;
+    std::string segment;             // of a join, as it was typed; for messages
     bool join = false;               // the inputs are segments, one after the other
     std::vector<std::string> cuts;   // parts of the inputs, one after the other
     std::optional<OutputKind> kind;  // of a stored task's output, whatever its name says

@@ -43,29 +43,38 @@ class Points {
     }
 
     void parse(StreamPart& part, const std::optional<QvFramerate>& rate) const {
-        if (!options_.from.empty()) part.in = parseInstant(options_.from, rate, "--from", whole_);
-        if (!options_.to.empty()) part.out = parseInstant(options_.to, rate, "--to", whole_);
+        if (!options_.from.empty()) part.in = parseInstant(options_.from, rate, from(), whole_);
+        if (!options_.to.empty()) part.out = parseInstant(options_.to, rate, to(), whole_);
         if (!options_.duration.empty()) part.out = parseSpan(options_.duration, rate, "--duration", part.in);
     }
 
     // `follows`: a sound that has ended before is silence next to its picture.
     void check(const StreamPart& part, const JobInput& input, const MediaTime& length, bool follows) const {
         if (part.out <= part.in && !options_.to.empty())
-            throw failure(Msg::toNotAfter, {options_.to, start()});
+            throw failure(Msg::toNotAfter, {to(), options_.to, start()});
         if (part.out <= part.in && !options_.duration.empty())
             throw failure(Msg::durationNone, {options_.duration});
         if (part.in >= length && !options_.from.empty() && !follows)
-            throw failure(Msg::fromAfterEnd, {options_.from, input.name, formatTime(length.seconds())});
+            throw failure(Msg::fromAfterEnd,
+                          {from(), options_.from, input.name, formatTime(length.seconds())});
     }
 
     void warn(const JobInput& input, const MediaTime& length) {
         const std::string end = formatTime(length.seconds());
         plan_.warnings.push_back(
             options_.to.empty() ? lineOf(Msg::durationAfterEnd, {options_.duration, start(), input.name, end})
-                                : lineOf(Msg::toAfterEnd, {options_.to, input.name, end}));
+                                : lineOf(Msg::toAfterEnd, {to(), options_.to, input.name, end}));
     }
 
-    std::string start() const { return options_.from.empty() ? "the start" : "--from " + options_.from; }
+    std::string named(const char* option, const char* ofSegment) const {
+        return options_.segment.empty() ? option : options_.segment + ": " + ofSegment;
+    }
+    std::string from() const { return named("--from", "from"); }
+    std::string to() const { return named("--to", "to"); }
+    std::string start() const {
+        if (options_.from.empty()) return "the start";
+        return options_.segment.empty() ? "--from " + options_.from : options_.from;
+    }
 
     JobPlan& plan_;
     const PointOptions& options_;

@@ -8,6 +8,7 @@ struct JobPlan;
 // As they were given; empty when they were not.
 struct PointOptions {
     std::string from, to, duration;
+    std::string segment;  // the segment of a join that the times are of, for messages
 };
 
 // Sets the part of each stream of the plan. Times from the end count from that of the picture, so that all

@@ -55,7 +55,7 @@ JoinPlanner::JoinPlanner(const PlanOptions& options, const OutputForm& form, Ope
 
 std::vector<SegmentWords> JoinPlanner::words() const {
     std::vector<SegmentWords> all;
-    for (const std::string& cut : options_.cuts) all.push_back({options_.inputs, parseRange(cut, "--cut")});
+    for (const std::string& cut : options_.cuts) all.push_back({options_.inputs, parseRange(cut, "--cut"), "--cut " + cut});
     if (options_.join)
         for (const std::string& word : options_.inputs) all.push_back(parseSegment(word));
     return all;
@@ -105,6 +105,7 @@ PlanOptions JoinPlanner::optionsOf(const SegmentWords& words, const std::vector<
     options.inputs = words.inputs;
     options.from = words.range.from;
     options.to = words.range.to;
+    options.segment = words.typed;
     const bool hasPicture =
         std::any_of(inputs.begin(), inputs.end(), [](const JobInput& input) { return !input.video.empty(); });
     if (std::all_of(inputs.begin(), inputs.end(), [](const JobInput& input) { return input.audio.empty(); }))
