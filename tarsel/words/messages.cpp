@@ -308,7 +308,7 @@ constexpr Message kMessages[] = {
     {Msg::pluginUnreadable, Exit::module, "the plug-in {file} was not loaded",                        "it {system}",                           "check the file and its permissions, or remove it"},
     {Msg::pluginUnsafe,     Exit::module, "the plug-in {file} was not loaded",                        "it {system}",                           "keep plug-ins where only you and root may write, or use --allow-unsafe-plugins"},
     {Msg::pluginInvalid,    Exit::module, "the plug-in {file} was not loaded",                        "it {system}",                           "replace it by a whole one for this machine, or remove it"},
-    {Msg::pluginUnresolved, Exit::module, "the plug-in {file} was not loaded",                        "it {system}",                           "install that library, or put it next to the plug-in"},
+    {Msg::pluginUnresolved, Exit::module, "the plug-in {file} was not loaded",                        "it {system}",                           "install what it needs, put it next to the plug-in, or remove the plug-in"},
     {Msg::pluginUnfit,      Exit::module, "the plug-in {file} was not loaded",                        "it {system}",                           "get a version of it that was built for this engine, or remove it"},
     {Msg::pluginForeign,    Exit::module, "the plug-in {file} was not loaded",                        "it {system}",                           "get one built for this version of the engine, or add the library that has it"},
     {Msg::pluginFailed,     Exit::module, "the plug-in {file} was not loaded",                        "it {system}",                           "ask its maker, or remove it"},
