@@ -1,4 +1,4 @@
-// The module classes of the library by name, for whoever makes one apart from the registry.
+// The module classes of the library by name, for code that makes one without the registry.
 #pragma once
 
 #include <algorithm>

@@ -12,10 +12,10 @@ class Any;
 
 class InputFile {
   public:
-    // 0 if `name` is text and the file opens and tells its length, else QvStatus::failed. `bufferBytes` is
+    // 0 if `name` is text and the file opens and has a length, else QvStatus::failed. `bufferBytes` is
     // the read-ahead for reads that are smaller than it; larger ones go straight into the caller's memory.
     int open(const Any& name, std::size_t bufferBytes);
-    // 0 if the source tells its length and can be moved to its start, else QvStatus::failed with a problem().
+    // 0 if the source knows its length and can be moved to its start, else QvStatus::failed with a problem().
     int open(QvByteSource& source);
     // The source if there is one, else the file.
     int open(const Any& name, std::size_t bufferBytes, QvByteSource* source);

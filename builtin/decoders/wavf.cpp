@@ -236,7 +236,7 @@ WavStatus HeaderReader::checkFormat() {
     return padded ? WavStatus::badFormat : WavStatus::ok;
 }
 
-// Whole chunks from here to the end of the file: then an empty "data" chunk is meant as it stands.
+// Whole chunks from here to the end of the file: then an empty "data" chunk is meant so.
 bool HeaderReader::chunksFillTheRest(long long position) {
     Chunk chunk;
     for (int i = 0; i < maxChunks && chunkAt(position, chunk); ++i) position = behindChunk(position, chunk);

@@ -5,8 +5,8 @@
 #include "core/encode/basemuxer.h"
 
 // Writes through the output that is attached, front to back, and corrects the headers when it is closed; the
-// output has to take BUF_SEEK_INFO. Beyond a limit the file goes on in further RIFF segments (OpenDML), up to
-// 2 TiB with the defaults; readers that know the first segment only still play that. A run that is aborted
+// output has to take BUF_SEEK_INFO. Beyond a limit the file continues in further RIFF segments (OpenDML), up
+// to 2 TiB with the defaults; readers that know the first segment only still play that. A run that is aborted
 // leaves a file without index.
 //
 // Video types of the encoders: BGR3, BGR4 (BGRA), I420, YV12, YUYV (YUY2), UYVY, v210. Each stream has

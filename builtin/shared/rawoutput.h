@@ -12,7 +12,7 @@ constexpr char rawWriteThrough[] = "writeThrough";
 
 enum class RawPutResult {
     ok,
-    noBlock,  // the stream gave no room, for no known reason; `RawOutput::asked` tells for how much
+    noBlock,  // the stream gave no room, for no known reason; `RawOutput::asked` is how much it was asked for
     failed,   // the target of the stream could not write: RawOutput::fault
 };
 

@@ -126,7 +126,7 @@ class QV_API QvPlatform {
     virtual std::string homeFolder();  // of the user; without a separator at the end
     virtual std::string tempFolder();  // likewise
     virtual bool isTerminal(std::FILE* stream);
-    virtual void debugOutput(const char* text);  // as it stands, no newline is added
+    virtual void debugOutput(const char* text);  // unchanged, no newline is added
 
     // --- Libraries and processes -----------------------------------------------------------------------
 

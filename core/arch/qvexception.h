@@ -46,7 +46,7 @@ class QV_API QvAssertFailure : public QvException {
 };
 
 // A broken contract whose cause is that there is no memory: where a contract promises a result that needs
-// memory, its failure is an assertion, and this tells it from a mistake of the caller.
+// memory, its failure is an assertion, and this shows that it is no mistake of the caller.
 class QV_API QvMemoryFailure : public QvAssertFailure {
   public:
     explicit QvMemoryFailure(const char* text = nullptr);

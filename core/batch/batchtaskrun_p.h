@@ -24,8 +24,8 @@ class BatchTaskRun {
   public:
     BatchTaskRun(BatchContext& batch, int index) : batch_(batch), index_(index) {}
 
-    // 0 also for a task that was skipped, and for one whose run failed: only taskFinished tells. Otherwise
-    // why it could not be begun. Does not throw.
+    // 0 also for a task that was skipped, and for one whose run failed: only taskFinished has the code.
+    // Otherwise why it could not be begun. Does not throw.
     int run(const Any& stored);
 
   private:

@@ -1,4 +1,4 @@
-// What an exception says, for code that goes on after one of any type.
+// What an exception says, for code that continues after one of any type.
 #pragma once
 
 struct FailureText {

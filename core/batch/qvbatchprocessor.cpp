@@ -112,7 +112,7 @@ int QvBatchProcessor::run() {
     return result;
 }
 
-// Does not throw, so that whoever waits for the end of the run learns it.
+// Does not throw, so that a thread that waits for the end of the run learns of it.
 int QvBatchProcessor::Private::runBatch() {
     BatchReport report(control, error, callback);
     BatchContext batch{control, error, report, options, smartRender};

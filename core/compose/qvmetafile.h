@@ -5,7 +5,7 @@
 //     QvMetafile file("mix.mmf");
 //     if (file.errorCode() == 0 && file.contains("AudioInterleave")) use(file.element("AudioInterleave"));
 //
-// Files come from anywhere: what damaged elements are assertions in open() is told before by check().
+// Files come from anywhere: check() reports beforehand the damaged elements that are assertions in open().
 #pragma once
 
 #include <memory>

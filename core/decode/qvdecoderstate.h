@@ -27,7 +27,8 @@ class QV_API QvDecoderState : public AnyDict {
 class QV_API QvDecoderStateManager {
   public:
     // Keeps states in `dir`/`name`; without `dir`, in the folder "decstate" of the user's settings. The
-    // folder is made; if that fails the user is told and the manager acts as if nothing were ever stored.
+    // folder is made; if that fails, the user log says so and the manager acts as if nothing were ever
+    // stored.
     explicit QvDecoderStateManager(const char* name, const Any& dir = Any());
 
     // A valid state is there; a stale one is removed.

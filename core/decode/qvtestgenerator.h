@@ -9,7 +9,7 @@
 //     std::unique_ptr<QvDecodePipe> source(QvTestGenerator::create(&video, nullptr));
 //     source->open();
 //
-// Video is BGR4. Reading goes on beyond "frames", with rising numbers: the reader counts. Sound is 16-bit
+// Video is BGR4. Reading continues beyond "frames", with rising numbers: the reader counts. Sound is 16-bit
 // stereo at 44100 Hz, whatever is asked for, and ends. See builtin/decoders/testcard.h for the picture.
 //
 // The dictionary that describes them, parameter "streams" of the module, has the Vectors "vids" and "auds"

@@ -45,7 +45,7 @@ class QV_API QvSettingsMapper {
 
     int setFieldByName(void* record, const char* name, const Any& value) const;
     Any getFieldByName(const void* record, const char* name) const;  // invalid on failure
-    // A Vector for a vector field. A row of the constructor's array may be given as it stands.
+    // A Vector for a vector field. A row of the constructor's array may be given unchanged.
     Any getField(const void* record, const ParamSpec& row) const;
     // Every key of the dictionary; -1 if one could not be set, the others are.
     int dictToStruct(const AnyDict& dict, void* record) const;

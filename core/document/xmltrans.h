@@ -1,6 +1,6 @@
 // Values and dictionaries as XML elements and back.
 //
-// The element's name tells the type; numbers are decimal text that ignores the locale:
+// The element's name is the type; numbers are decimal text that ignores the locale:
 //
 //     inv                empty: Invalid, and what has no form of its own
 //     i32 i64 fl         data; a float has six decimal places

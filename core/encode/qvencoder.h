@@ -20,7 +20,7 @@ class QV_API QvEncoder : public QvCodec {
   public:
     explicit QvEncoder(const QvModule* module = nullptr) : QvCodec(module) {}
 
-    // Makes `stream` the output and tells it its attachee (QvBufStream::setAtachee). An output that was
+    // Makes `stream` the output and itself its attachee (QvBufStream::setAtachee). An output that was
     // attached before is detached first. The stream stays its maker's: a multiplexer's for an encoder, a
     // sink's for a multiplexer. QvStatus::invalidArgument for null.
     virtual int attachOutStream(QvBufStream* stream);

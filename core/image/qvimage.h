@@ -13,7 +13,7 @@ class QV_API QvImage {
     // Reads a PNG. The picture becomes BGR4 of the image's size rounded up to even, black where the image has
     // no pixel; a frame that has this format and size is reused as it is. `alpha`, if given and the image has
     // an alpha channel, becomes GRAY of the same size. A damaged image gives what could be read,
-    // or nothing, which leaves the frame as it was: the result is 0, and a warning in the user log tells.
+    // or nothing, which leaves the frame as it was: the result is 0, with a warning in the user log.
     // 0; -1 with a message in the user log if the file can't be opened, without if it is no PNG.
     static int loadFrame(QvFrame& picture, const Any& path, QvFrame* alpha = nullptr, unsigned flags = 0);
 

@@ -64,7 +64,7 @@ class QV_API ProcessParams : public AnyDict {
     // "holdLast", Int32.
     void setHoldLast(bool on);
     bool holdLast() const;
-    // 0 off, 1 on, 2 passed on as it stands; others are logged and stored as 0.
+    // 0 off, 1 on, 2 passed on unchanged; others are logged and stored as 0.
     void setSmartRender(int mode);
     int smartRender() const;
     void setQualityLog(const QvEncodingQualityStatsSetup& setup);

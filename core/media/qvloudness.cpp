@@ -102,7 +102,7 @@ int QvLoudness::init(int channels, int samplerate, long long channelMask) {
     *state_ = {};
     if (channels < 1 || channels > maxChannels || samplerate < 1) return QvStatus::invalidArgument;
     constexpr int modes = EBUR128_MODE_I | EBUR128_MODE_LRA | EBUR128_MODE_TRUE_PEAK;
-    errno = 0;  // nothing else tells why there is no meter
+    errno = 0;  // the only reason that is given when there is no meter
     state_->meter.reset(
         ebur128_init(static_cast<unsigned>(channels), static_cast<unsigned long>(samplerate), modes));
     if (!state_->meter) return errno == ENOMEM ? QvStatus::outOfMemory : QvStatus::invalidArgument;

@@ -36,7 +36,7 @@ class QV_API QvBsSplitVideo : public QvBufStreamFifoCb {
     bufstream* input() override;
     bufstream* output() override;
     int registerObserver(QvAuxInfoObserver* observer) override;
-    int unregisterObserver(QvAuxInfoObserver* observer) override;  // a plain file still tells a listed one
+    int unregisterObserver(QvAuxInfoObserver* observer) override;  // a listed one still hears of a plain file
     int unregisterAllObservers() override;
     TPtrList<QvAuxInfoObserver>* observers() override;
 

@@ -1,4 +1,4 @@
-// The first failure of a stream's input or output, kept for whoever asks after the work.
+// The first failure of a stream's input or output, kept until the work is done.
 #pragma once
 
 #include <cstdint>
@@ -13,7 +13,7 @@
 class QV_API QvIoFailure {
   public:
     // Keeps the first one: "what 'name': reason" with the system's text of `code`, an errno value (0 counts
-    // as EIO). report() also tells the user, through qv_log() as an error, unless the user asked for it
+    // as EIO). report() also makes it an error in qv_log(), unless the user asked for it
     // (ECANCELED); note() does not.
     void report(int code, const char* what, const QvWideString& name);
     void note(int code, const char* what, const QvWideString& name);

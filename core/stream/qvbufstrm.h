@@ -19,7 +19,7 @@ namespace QVThreads {
 class QvCriticalSection;
 }
 
-// Hears of each item of side information, in the thread of whoever writes the stream.
+// Hears of each item of side information, in the thread that writes the stream.
 class QV_API QvAuxInfoObserver {
   public:
     virtual ~QvAuxInfoObserver();

@@ -254,7 +254,8 @@ class QV_API Any {
     double toFloat() const { return toDouble(); }
 
     // Text as UTF-8 or as UTF-16; invalid for a value that is no text. What is no valid text survives the way
-    // there and back, as core/arch/widename.h tells, so that file names of any bytes keep their meaning.
+    // there and back, as described in core/arch/widename.h, so that file names of any bytes keep their
+    // meaning.
     Any toString() const;
     Any toWString() const;
     // Characters from `start` up to but not including `end`. Negative positions count from the end, -1 as

@@ -25,7 +25,7 @@ constexpr Lead leadOf(unsigned char byte) {
     return {3, 0x80, 0xBF};
 }
 
-// Reads the character and tells whether it was well-formed.
+// Reads the character. False: it was ill-formed.
 bool decode(std::string_view text, std::size_t& position, char32_t& character) {
     const auto first = static_cast<unsigned char>(text[position++]);
     character = first;

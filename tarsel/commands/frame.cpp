@@ -78,7 +78,7 @@ class Reading {
     }
 
   private:
-    // For the end in the middle of it, whoever holds the line.
+    // For an end in the middle of it, even while another thread holds the line.
     void clearLine() {
         ending_ = true;
         if (progress_.onTerminal() && stderrHasRoom()) writeToStderr("\r\x1b[K");

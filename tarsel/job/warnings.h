@@ -11,7 +11,7 @@ class Warnings {
 
     void add(const std::string& line) { lines_.push_back(line); }
     void add(const std::vector<std::string>& lines);
-    // What the engine has told its user since the last time, each line once. `named` puts the user's file
+    // The engine's messages for its user since the last time, each line once. `named` puts the user's file
     // names into a sentence of the engine.
     void addEngine(const std::function<std::string(std::string)>& named);
 

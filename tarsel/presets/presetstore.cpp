@@ -16,7 +16,7 @@ void loadPresets(const std::string& file, QvUserPresets& presets, int mode, int*
     const std::string fault = QvUserPresets::check(name);
     if (memory.ranOut()) throw std::bad_alloc();
     if (!fault.empty()) throw failure(Msg::presetsDamaged, {file, fault});
-    // An element of the older form that is none is left out, and the others are there.
+    // An element of the older form that is no preset is left out; the others stay.
     int version = 0;
     presets.load(name, mode, &version);
     if (version == 0) throw failure(Msg::presetsDamaged, {file, "it changed while it was read"});

@@ -14,7 +14,7 @@
 //     3
 //                                           the other side follows; refused in modes 4 and 5
 //     "moveCropBox" (Point, set only)       its top left corner
-//     "cropBox" (Rect)               whole  all of it, as it stands
+//     "cropBox" (Rect)               whole  all of it, unchanged
 //     "padTop", "padBottom", "padLeft", "padRight"  0  pixels to 16384; without effect unless in mode 1
 //     "reset" (set only)                    the whole input, as far as the mode allows, without pads
 //     "state" (Dict)                        box, mode, aspects and pads at once; all or nothing. Its

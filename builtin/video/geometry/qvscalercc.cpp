@@ -158,7 +158,7 @@ int QvScalerCC::open() {
     if (qvPixelFormat(settings_.fourcc) && settings_.outWidth > 0 && settings_.outHeight > 0)
         made = output_.init(settings_.fourcc, settings_.outWidth, settings_.outHeight);
     if (made != QvStatus::ok) {
-        setError(made, "QvScalerCC::Can not init output frame!");  // the code tells want of memory
+        setError(made, "QvScalerCC::Can not init output frame!");  // the code may be that of no memory
         return QvStatus::failed;
     }
     setState(static_cast<State>(stateOpened));

@@ -3,7 +3,7 @@
 // Parameters:
 //
 //     "filename"            the movie
-//     "decoder"             the module that opens it; empty: its extension tells
+//     "decoder"             the module that opens it; empty: the one for its extension
 //     "decoderParams" Dict  set on the open decoder, as the format of a raw file; as text, with ";" between:
 //                           FOURCC=BGRA;width=64;height=64
 //     "xpos", "ypos"   0    as of the module "logo": pixels from the left and top, or, negative, from the

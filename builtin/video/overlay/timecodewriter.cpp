@@ -19,7 +19,7 @@ using Settings = TimecodeSettings;
 constexpr int leastSize = 14;
 constexpr int upperFieldOnly = 2;
 
-// Index of a text in a pair of them; a number is taken as it stands. -1: neither.
+// Index of a text in a pair of them; a number is the index itself. -1: neither.
 int chosen(const Any& value, const char* const (&names)[2]) {
     int number = 0;
     if (qvparam::convert(value, number)) return number == 1;

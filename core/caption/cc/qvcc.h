@@ -120,7 +120,7 @@ class QV_API QvCcData {
     // 0. -1, with this list unchanged, for a dictionary that is no caption data.
     int restore(const AnyDict& dict);
 
-    // cc_data as it stands in a bitstream, `fmt` as BufferFormat.
+    // cc_data as in a bitstream, `fmt` as BufferFormat.
     static int detectBufferFmt(int size, const unsigned char* data);  // a53, a72, or -1
     int byteSize(int fmt) const;                                      // -12 for an unknown format
     // Writes byteSize(fmt) bytes and returns their number. -12: unknown format; -18: more than 31 pairs, or

@@ -93,7 +93,8 @@ class QV_API QvSubtitles {
     const QvFramerate& rate() const { return rate_; }
     Encoding encoding() const { return encoding_; }
     // For people: "SubRip", "SubViewer" or "MicroDVD"; and "UTF-16LE" and so on for a file with a mark, else
-    // "ASCII", "UTF-8" where the bytes are that, or "8-bit" for those of a code page that no file tells.
+    // "ASCII", "UTF-8" where the bytes are that, or "8-bit" for those of a code page that the file does not
+    // name.
     const char* formatName() const;
     const char* encodingName() const;
     int maxRows() const { return maxRows_; }  // of all entries; 0 without any

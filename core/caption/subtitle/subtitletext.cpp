@@ -16,7 +16,7 @@ using namespace std::string_view_literals;
 
 constexpr std::size_t spareBytes = 4;
 
-// Old files end their lines with a carriage return alone; the first line tells.
+// Old files end their lines with a carriage return alone; the first line shows it.
 bool endsLinesWithCr(std::string_view text) {
     const std::size_t first = text.find_first_of("\r\n");
     if (first == text.npos) return false;

@@ -34,7 +34,7 @@ struct SubtitleMark {
 };
 SubtitleMark findMark(std::string_view bytes);
 
-// The text after the mark as UTF-8 (or as it stands, in an encoding that the file does not tell), with line
+// The text after the mark as UTF-8 (or unchanged, in an encoding that the file does not name), with line
 // feeds where the file uses carriage returns alone. A unit of several bytes is taken in this machine's order,
 // or with its bytes `swapped`.
 std::string subtitleText(std::string_view bytes, const SubtitleMark& mark, bool swapped);

@@ -27,7 +27,7 @@ struct FontGlyph {
 // in mind whether it ran out, and that has a reserve for the interpreters of three faces.
 class FontLibrary {
   public:
-    FontLibrary();  // tells the outcome in the debug log
+    FontLibrary();  // the outcome is in the debug log
     FontLibrary(const FontLibrary&) = delete;
     FontLibrary& operator=(const FontLibrary&) = delete;
     FT_Library get() const { return library_.get(); }  // null if FreeType can't be used

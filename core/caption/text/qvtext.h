@@ -2,7 +2,7 @@
 //
 //     std::u32string line = QvText::toUtf32(bytes, 1256);   // bounded, for text of any origin
 //
-// Bad input never fails: what is ill-formed becomes U+FFFD, as core/value/utf.h tells. UTF-16 and UTF-32 are
+// Bad input never fails: what is ill-formed becomes U+FFFD, see core/value/utf.h. UTF-16 and UTF-32 are
 // taken in this machine's byte order.
 #pragma once
 

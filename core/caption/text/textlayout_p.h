@@ -20,7 +20,7 @@ struct TextLine {
     long long width = 0;              // pixels that the pen moved
 };
 
-// Lays out a line. Tags change `style`, which goes on to the next line, and are not drawn.
+// Lays out a line. Tags change `style`, which continues on the next line, and are not drawn.
 TextLine layOutLine(std::u32string_view line, FontFaces& faces, FontStyle& style);
 // As several lines if it is wider than `widest` pixels; 0: as one.
 std::vector<TextLine> layOutLines(std::u32string_view line, FontFaces& faces, FontStyle& style,

@@ -54,7 +54,7 @@ int qvReadGzip(const Any& name, Any& out) {
     std::vector<char> bytes;
     bool whole = false;
     try {
-        // The library hands on a file that is not gzip as it stands; here that is a damaged one.
+        // The library returns a file that is not gzip unchanged; here that is a damaged one.
         whole = readAll(file, bytes) && (bytes.empty() || !gzdirect(file));
     } catch (const std::bad_alloc&) {
     }

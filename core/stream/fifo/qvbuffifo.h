@@ -63,7 +63,7 @@ class QV_API QvBufStreamFifoCb : public QvBufStream {
     virtual void cbProgress(int bytes) = 0;  // bytes written since the last call
     virtual void cbAuxinfo(unsigned offset, unsigned id, void* info, unsigned size);
 
-    // Logs, and refuses all further blocks and bytes: how a consumer tells the writer that it has failed.
+    // Logs, and refuses all further blocks and bytes: how the writer learns that a consumer has failed.
     void stopProcessing();
 
   private:

@@ -36,8 +36,8 @@ class QV_API QvFileBufStream : public QvBufStream {
     int unregisterAllObservers() override;
     TPtrList<QvAuxInfoObserver>* observers() override;
 
-    // Brings what is buffered to the file system and goes on. 0, or -1 with ioError() on failure and when
-    // reading. Records confirm into the buffer, so a full disc may show only here or in destroy().
+    // Brings what is buffered to the file system; the stream stays open. 0, or -1 with ioError() on failure
+    // and when reading. Records confirm into the buffer, so a full disc may show only here or in destroy().
     int writeOut();
 
   protected:

@@ -40,7 +40,7 @@ void NavCollector::nextSegment(const QvWideString& name) {
     try {
         segments_.push_back({.first = static_cast<uint32_t>(data_.sector.size()), .name = name});
     } catch (const std::bad_alloc&) {
-        // The present segment goes on.
+        // The present segment continues.
     }
 }
 

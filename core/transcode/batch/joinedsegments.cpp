@@ -328,7 +328,7 @@ int JoinedSegments::readLeadingSound(int n, int stream) {
 }
 
 // The later segments begin anew when their turn comes. Where video leads, all streams have left the first
-// segment together and go back together, for whoever has read the picture alone seeks nothing else.
+// segment together and go back together, because a caller that has read the picture alone seeks nothing else.
 int JoinedSegments::restart(int stream, bool video) {
     if (video) {
         at(frames, stream).forget();

@@ -38,7 +38,8 @@ class QV_API QvTaskFile {
 
     // Checks a file and restores its task: the caller owns the task, the pipe and the decoders. A task with
     // one segment that is not disabled is restored as QvTask::fromState does, any other is a QvBatchTask with
-    // these options. After a fault the result is null, nothing was made, and `fault`, if given, tells.
+    // these options. After a fault the result is null, nothing was made, and `fault`, if given, is the
+    // reason.
     static QvTask* open(const Any& file, QvDPipeList& decoders, QvEncodePipe** encoder,
                         QvFileOpenCb* callback = nullptr, QvTaskFault* fault = nullptr,
                         int options = QvBatchTask::skipDisabled | QvBatchTask::everySegmentOpens) noexcept;

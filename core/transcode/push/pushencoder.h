@@ -19,7 +19,7 @@
 // pictures is dropped; where it ends before them, silence follows.
 //
 // Writes may come from any threads, for each stream in the order of its pictures; they copy and never wait:
-// when the worker is slower than the caller, memory grows (a warning in the log tells). The other operations
+// when the worker is slower than the caller, memory grows, with a warning in the log. The other operations
 // belong to one thread. The first video and the first audio stream go through the links.
 #pragma once
 

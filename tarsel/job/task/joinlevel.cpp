@@ -27,7 +27,7 @@ AnyDict wideOutput(const SoundFormat& format) {
     return state;
 }
 
-// The filter of a job of one part decides, with what it would be told there.
+// The filter of a job of one part decides, with the parameters that it would have there.
 double gainFor(const QvLoudness& meter, const SoundTarget& target) {
     const auto filter = makeAnyCodec("normalizer", QvModuleType::audioFilter);
     if (filter->restore(normalizerState(target)) != QvStatus::ok)

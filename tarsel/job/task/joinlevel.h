@@ -15,8 +15,9 @@ class JoinLevel {
     JoinLevel(const Join& join, const SoundTarget& target, std::string name);
 
     // Reads each sound once and returns the gains that bring them to the target, in dB and by their numbers.
-    // `goesOn` is told now and then how far this is, from 0 to 1; if it returns false there is no result. The
-    // engine warns of a target that is not reached. Throws Failure for a sound that can't be read.
+    // `goesOn` is called now and then with the share that is done, from 0 to 1; if it returns false there is
+    // no result. The engine warns of a target that is not reached. Throws Failure for a sound that can't be
+    // read.
     std::optional<std::vector<double>> gains(const std::function<bool(double)>& goesOn) const;
 
   private:

@@ -15,7 +15,7 @@ void refuse(bool given, const char* option) {
     if (given) throw failure(Msg::joinRefuses, {option});
 }
 
-// Several segments are told apart by the names that were typed; a task of one finds its decoder by the name
+// Several segments differ by the names that were typed; a task of one finds its decoder by the name
 // that the decoder gives itself, which is another one for the test generator.
 AnyDict storedInput(const Source& source, const std::string& name, bool alone) {
     AnyDict decoder;
@@ -55,7 +55,8 @@ JoinPlanner::JoinPlanner(const PlanOptions& options, const OutputForm& form, Ope
 
 std::vector<SegmentWords> JoinPlanner::words() const {
     std::vector<SegmentWords> all;
-    for (const std::string& cut : options_.cuts) all.push_back({options_.inputs, parseRange(cut, "--cut"), "--cut " + cut});
+    for (const std::string& cut : options_.cuts)
+        all.push_back({options_.inputs, parseRange(cut, "--cut"), "--cut " + cut});
     if (options_.join)
         for (const std::string& word : options_.inputs) all.push_back(parseSegment(word));
     return all;
