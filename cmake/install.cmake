@@ -7,6 +7,7 @@ set(QV_INCLUDE_ROOT ${CMAKE_INSTALL_INCLUDEDIR}/qvplugcore)
 install(TARGETS qvplugcore EXPORT qvplugcore-targets LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR})
 install(DIRECTORY ${CMAKE_SOURCE_DIR}/core DESTINATION ${QV_INCLUDE_ROOT}
         FILES_MATCHING PATTERN "*.h" PATTERN "posix" EXCLUDE PATTERN "*_p.h" EXCLUDE)
+install(FILES ${CMAKE_SOURCE_DIR}/plugins/wire.h DESTINATION ${QV_INCLUDE_ROOT}/plugins)
 install(FILES ${CMAKE_BINARY_DIR}/include/qvplugcore/qvplugcore.h DESTINATION ${QV_INCLUDE_ROOT})
 
 # A header that has moved is still found under its former name.
