@@ -2,10 +2,13 @@
 
 #include <algorithm>
 #include <atomic>
+#include <condition_variable>
+#include <mutex>
 #include <new>
 
 #include "tarsel/host/console.h"
 #include "tarsel/host/events.h"
+#include "tarsel/host/keyboard.h"
 #include "tarsel/host/memory.h"
 #include "tarsel/job/jobrun.h"
 #include "tarsel/job/keptchunks.h"
@@ -18,6 +21,54 @@
 #include "tarsel/sound/channelmap.h"
 #include "tarsel/source/joinedsound.h"
 #include "tarsel/words/messages.h"
+
+namespace {
+
+// The pass before the run, in which the sounds are measured. Keys and signals come on threads of their own.
+class MeasuringPass {
+  public:
+    explicit MeasuringPass(const JobOptions& options)
+        : progress(options.progress, options.quiet || options.dryRun, "task 1 of 1  ") {}
+
+    ProgressState now() const {
+        return {.part = part_ / 2, .pass = 1, .passes = 2, .state = paused_ ? "paused" : "running"};
+    }
+    // Shows how far the measuring is, and waits while it is paused. Whether there was no stop.
+    bool goOn(double part) {
+        part_ = part;
+        if (progress.due()) progress.update(now());
+        std::unique_lock hold(lock_);
+        changed_.wait(hold, [this] { return !paused_ || stop_; });
+        return !stop_;
+    }
+    void stop() {
+        const std::lock_guard hold(lock_);
+        stop_ = true;
+        changed_.notify_all();
+    }
+    void pressed(char key) {
+        if (key == 'q') Signals::interrupt();
+        if (key == '?') progress.say(kKeyHelp);
+        if (key != 'p') return;
+        {
+            const std::lock_guard hold(lock_);
+            paused_ = !paused_;
+            paused_ ? progress.time().pause() : progress.time().resume();
+        }
+        progress.show(now());
+        changed_.notify_all();
+    }
+
+    Progress progress;
+
+  private:
+    std::atomic<double> part_{0};
+    std::atomic<bool> paused_{false}, stop_{false};
+    std::mutex lock_;
+    std::condition_variable changed_;
+};
+
+}  // namespace
 
 Job::Job(const JobOptions& options, Signals& signals)
     : options_(options),
@@ -168,33 +219,28 @@ std::vector<std::string> Job::filesRead() const {
 }
 
 std::pair<std::vector<double>, double> Job::measureGains() {
-    std::atomic<bool> stop{false};
-    std::atomic<double> part{0};
-    const auto now = [&] { return ProgressState{.part = part / 2, .pass = 1, .passes = 2}; };
-    Progress progress(options_.progress, options_.quiet || options_.dryRun, "task 1 of 1  ", false);
-    const Signals::Watch measuring(signals_, {.first = [&](int) { stop = true; },
+    MeasuringPass pass(options_);
+    Keyboard keyboard(pass.progress.onTerminal(), [&](char key) { pass.pressed(key); });
+    const Signals::Watch measuring(signals_, {.first = [&](int) { pass.stop(); },
                                               .second = [this] { return parts_.outputs.leave(); },
-                                              .report = [&] { progress.report(now()); },
-                                              .suspend = [&] { progress.time().stopping(); },
-                                              .resume = [&] { progress.time().continued(); }});
+                                              .report = [&] { pass.progress.report(pass.now()); },
+                                              .suspend = [&] { pass.progress.time().stopping(); },
+                                              .resume = [&] { pass.progress.time().continued(); }});
     const MemoryWatch memory;
-    progress.start(now());
+    pass.progress.start(pass.now());
     std::optional<std::vector<double>> gains;
     try {
-        gains = level_->gains([&](double measured) {
-            part = measured;
-            if (progress.due()) progress.update(now());
-            return !stop && signals_.received() == Exit::done;
-        });
+        gains = level_->gains(
+            [&](double measured) { return pass.goOn(measured) && signals_.received() == Exit::done; });
     } catch (const std::exception&) {
         if (memory.ranOut()) throw std::bad_alloc();
         throw;
     }
-    ProgressState end = now();
-    if (!gains) end.state = "stopped";
-    progress.finish(end);
+    ProgressState end = pass.now();
+    end.state = gains ? "running" : "stopped";
+    pass.progress.finish(end);
     if (!gains) throw Failure(signals_.received(), lineOf(Msg::stoppedWithNothing));
-    return {*gains, progress.time().seconds()};
+    return {*gains, pass.progress.time().seconds()};
 }
 
 void Job::checkWarnings() const {

@@ -106,7 +106,7 @@ void JobTranscoder::requestStop() {
 void JobTranscoder::pressed(char key) {
     if (key == 'p') isPaused() ? unpause() : pause();
     if (key == 'q') Signals::interrupt();
-    if (key == '?') progress_.say("tarsel: keys: p pauses and resumes, q stops the job, ? shows this");
+    if (key == '?') progress_.say(kKeyHelp);
 }
 
 void JobTranscoder::report() {

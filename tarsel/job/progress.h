@@ -52,6 +52,9 @@ class RunningTime {
            longStepEnd_ = -1;  // between two ticks, and when the second was; negative for never
 };
 
+// What '?' shows.
+inline constexpr const char* kKeyHelp = "tarsel: keys: p pauses and resumes, q stops the job, ? shows this";
+
 class Progress {
   public:
     // Automatic: a line when the standard error is a terminal, otherwise a log; `quiet` leaves only objects.

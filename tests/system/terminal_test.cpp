@@ -12,9 +12,19 @@ class Terminal : public Tool {
 };
 
 TEST_F(Terminal, KeysPauseResumeAndStop) {
-    for (const char* stop : {"q", "\x03"}) {
-        Process run(words({"transcode", "testgen:size=64x64,duration=20000,audio=0", "-o", "out.raw"}),
-                    screen);
+    const struct {
+        const char* stop;
+        Words job;
+    } cases[] = {
+        {"q", {"transcode", "testgen:size=64x64,duration=20000,audio=0", "-o", "out.raw"}},
+        {"\x03", {"transcode", "testgen:size=64x64,duration=20000,audio=0", "-o", "out.raw"}},
+        // while the sound of a join is measured
+        {"q",
+         {"transcode", "--join", "testgen:size=64x64,duration=20000", "testgen:size=64x64,duration=20000",
+          "--normalize", "-o", "out.raw"}},
+    };
+    for (const auto& [stop, job] : cases) {
+        Process run(words(job), screen);
         ASSERT_TRUE(run.waitFor("keys: p q ?"));
         run.type("?");
         ASSERT_TRUE(run.waitFor("p pauses and resumes, q stops the job"));
