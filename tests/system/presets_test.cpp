@@ -260,6 +260,12 @@ TEST_F(Presets, GiveAnOutputWhatTheOptionsLeaveOpen) {
     EXPECT_TRUE(contents("a.raw") == contents("b.raw") && contents("a.wav") == contents("b.wav"));
 }
 
+TEST_F(Presets, OneWithoutStreamsWritesNothing) {
+    works({"presets", "save", "Bare", "--no-video", "--no-audio"});
+    fails(2, {"transcode", "testgen:duration=0.1", "--preset", "bare", "-o", "x.raw"},
+          {"the preset 'Bare' has neither picture nor sound", "'x.raw'"});
+}
+
 TEST_F(Presets, LightUpWithTheModulesOfPlugins) {
     const auto names = [&](const Words& words) {
         std::set<std::string> all;
@@ -285,6 +291,8 @@ TEST_F(Presets, LightUpWithTheModulesOfPlugins) {
         failsAs(2, tarsel(coded(job + options + Words{"-o", "w.h264"})),
                 {options[0], "'h264venc'", "--match"}, options[0]);
     fails(2, coded(job + Words{"-o", "w.yuv", "--preset", "h.264 main"}), {"'w.yuv'"});
+    // The other multiplexer of an extension does where the first one is missing.
+    EXPECT_THAT(works(coded(job + Words{"-o", "x.dv", "--dry-run"})).out, HasSubstr("dvmux"));
     works(coded({"presets", "save", "Small", "--preset", "h264_high", "--size", "64x48"}));
     works(coded(job + Words{"-o", "s.h264", "--preset", "small"}));
     EXPECT_EQ(contents("s.h264").substr(0, 6), "64x48\n");
