@@ -32,7 +32,7 @@ void choosePreset(JobOptions& job) {
     const bool writes = job.muxer != "nullmux";
     const std::string extension = writes && !job.output.empty() ? formatName(job) : "";
     if (!job.presetName.empty() || (!extension.empty() && !writesItself(extension)))
-        job.preset = outputPreset(job.presetName, extension, writes ? job.muxer : "");
+        job.preset = outputPreset(job.presetName, extension, writes ? job.muxer : "", job.output);
     if (!job.preset && job.match) throw failure(Msg::matchNoPreset);
     if (!job.preset) return;
     const QvPreset& preset = job.preset->preset();
