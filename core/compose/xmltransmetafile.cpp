@@ -87,6 +87,10 @@ void XmlTransMetafile::damaged(int line, const char* reason) const {
 }
 
 Any XmlTransMetafile::resolved(const Any& name) const {
+    if (name.size() == 0) {
+        damaged(__LINE__, "an empty file name in AudioInterleave");
+        return name;
+    }
     return QvFile::isAbsolutePath(name) ? name : QvFile::joinPath(basePath_, name);
 }
 

@@ -197,6 +197,7 @@ int QvFileMux::checkMuxer(QvMuxer& muxer, QvBufStream& output) {
 int QvFileMux::run(const char* muxer, const Any& output) {
     cancel_->clear();
     written_.clear();
+    if (!muxer) return fail(QvStatus::invalidArgument, "There is no multiplexer");
     if (const int result = check(); result != QvStatus::ok) return result;
     if (const int result = checkOutput(output); result != QvStatus::ok) return result;
     const std::unique_ptr<QvCodec> codec(qv_registry()->newCodec(muxer));

@@ -167,7 +167,11 @@ class FileSource : public QvByteSource {
         return -1;
     }
     bool canMove() const override { return length_ >= 0; }
-    bool moveTo(long long position) override { return QvFile::fseek64(file_.get(), position, SEEK_SET) == 0; }
+    bool moveTo(long long position) override {
+        if (QvFile::fseek64(file_.get(), position, SEEK_SET) != 0) return false;
+        std::clearerr(file_.get());  // the end of the file is no failure after that
+        return true;
+    }
     long long length() override { return length_; }
     void release() override { file_.reset(); }
 

@@ -4,6 +4,7 @@
 #include "tarsel/commands/commands.h"
 #include "tarsel/host/console.h"
 #include "tarsel/host/files.h"
+#include "tarsel/host/standardinput.h"
 #include "tarsel/job/task/storedtask.h"
 #include "tarsel/job/task/tasktext.h"
 #include "tarsel/source/source.h"
@@ -103,7 +104,7 @@ void describeWords(const QvDecodePipe& decoder, Json& file) {
 Json describe(const Source& source) {
     Json file = Json::object();
     file["file"] = validUtf8(source.name());
-    file["decoder"] = source.decoder().name();
+    file["decoder"] = source.decoderName();
     if (source.bytes() >= 0) file["bytes"] = source.bytes();
     const double duration = source.duration();
     file["duration_s"] = duration < 0 ? Json(nullptr) : Json(duration);
@@ -236,7 +237,7 @@ Json showTask(const std::string& name, bool json) {
 
 struct Given {
     std::vector<std::string> files;
-    std::string raw;
+    std::string raw, inputFormat;
     bool json = false;
 };
 
@@ -244,13 +245,14 @@ struct Given {
 void info(const Given& given) {
     Json all = Json::array();
     std::vector<std::string> failures;
+    const auto standard = standardInputOf(given.files, given.inputFormat);
     for (const auto& name : given.files) {
         try {
             if (isTaskFile(name)) {
                 all.push_back(showTask(name, given.json));
                 continue;
             }
-            const Source source(name, given.raw);
+            const Source source(name, given.raw, standard.get());
             all.push_back(describe(source));
             if (!given.json) printFile(all.back());
             if (all.back().contains("damage"))
@@ -275,7 +277,9 @@ void info(const Given& given) {
 void addInfo(CommandLine& line) {
     Command command = line.command("info", "Show streams, formats and durations of files");
     auto given = std::make_shared<Given>();
-    command.arguments("FILE", given->files, "Files, or testgen:...");
+    command.arguments("FILE", given->files, "Files, testgen:..., or - for the standard input");
+    command.option("--input-format", given->inputFormat,
+                   "What the standard input holds, as an extension: wav, ...", "EXT");
     command.option("--raw", given->raw, "Format of a raw file: size=WxH,pixel=FORMAT,rate=R", "K=V,...");
     command.flag("--json", given->json, "Print JSON, one array of files");
     command.action([given] { info(*given); });

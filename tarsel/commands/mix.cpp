@@ -1,4 +1,6 @@
+#include <cmath>
 #include <cstdio>
+#include <cstdlib>
 #include <filesystem>
 
 #include "tarsel/commands/commands.h"
@@ -13,6 +15,7 @@
 #include "tarsel/words/json.h"
 #include "tarsel/words/messages.h"
 #include "tarsel/words/timespec.h"
+#include "tarsel/words/xmlnames.h"
 
 namespace {
 
@@ -20,6 +23,8 @@ namespace fs = std::filesystem;
 
 constexpr double kMostWeight = 32767;
 constexpr int kMostNumber = 255;  // of a stream or a channel
+// Half of what a weight is a multiple of when sounds are mixed.
+constexpr double kWeightTolerance = 0.5 / 65536;
 
 struct Given {
     std::string file, output;
@@ -141,6 +146,28 @@ void renameFiles(AnyDict& setup, const fs::path& folder) {
             source.asDict().set("src", nameFor(source.asDict().get("src"), folder));
 }
 
+std::string written(const char* format, double weight) { return Any::sprintf(format, weight).asString(""); }
+
+// What the file would not keep is refused, or said of weights, which have three decimals there.
+void requireKept(const AnyDict& setup, const std::string& output) {
+    const auto keep = [&](const Any& value) {
+        const std::string text = value.toString().asString("");
+        if (!xmlAttributeKeeps(text)) throw failure(Msg::xmlNameLost, {output, text});
+    };
+    for (const char* list : {"decoders", "filters"})
+        for (const Any& entry : setup.getVector(list)) keep(entry.asDict().get("file"));
+    for (const Any& channel : setup.getVector("outChannels")) {
+        if (channel.asDict().get("pos").isText()) keep(channel.asDict().get("pos"));
+        for (const Any& source : channel.asDict().getVector("source")) {
+            keep(source.asDict().get("src"));
+            const double weight = source.asDict().getDouble("weight");
+            const std::string kept = written("%.3f", weight);
+            if (std::fabs(std::strtod(kept.c_str(), nullptr) - weight) > kWeightTolerance)
+                tell(Level::warning, lineOf(Msg::mixWeightRounded, {output, written("%g", weight), kept}));
+        }
+    }
+}
+
 void write(const Given& given, const AnyDict& mix, const std::vector<std::string>& files) {
     requireNoFolder(given.output, "mmf");
     if (!isMixName(given.output)) throw failure(Msg::mixName, {given.output});
@@ -152,6 +179,7 @@ void write(const Given& given, const AnyDict& mix, const std::vector<std::string
     renameFiles(renamed, fs::path(absoluteName(given.output)).parent_path());
     QvAudioMixDecSetup setup;
     setup.restore(renamed);
+    requireKept(renamed, given.output);
     try {
         setup.save(Any(outputs.begin("mmf").c_str()));
     } catch (const QvFileException& failure) {

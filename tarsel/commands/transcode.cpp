@@ -18,7 +18,7 @@ struct Given {
     JobOptions job;
     OutputOptions outputs;
     ProgressOption progress;
-    std::string samplerate, channels, bits, threads;
+    std::string samplerate, channels, bits, threads, inputFormat;
 };
 
 int parseBits(const std::string& text) {
@@ -32,7 +32,7 @@ void choosePreset(JobOptions& job) {
     const bool writes = job.muxer != "nullmux";
     const std::string extension = writes && !job.output.empty() ? formatName(job) : "";
     if (!job.presetName.empty() || (!extension.empty() && !writesItself(extension)))
-        job.preset = outputPreset(job.presetName, extension, writes ? job.muxer : "");
+        job.preset = outputPreset(job.presetName, extension, writes ? job.muxer : "", job.output);
     if (!job.preset && job.match) throw failure(Msg::matchNoPreset);
     if (!job.preset) return;
     const QvPreset& preset = job.preset->preset();
@@ -46,6 +46,12 @@ void checkMuxer(const JobOptions& job) {
     const std::vector<std::string> own = {"rawmux", "rawavimux", "nullmux"};
     if (std::find(own.begin(), own.end(), job.muxer) == own.end())
         throw failure(Msg::muxerUnknown, {job.muxer, suggestion(job.muxer, own)});
+}
+
+void takeStandardInput(Given& given) {
+    JobOptions& job = given.job;
+    job.standardInput = standardInputOf(job.inputs, given.inputFormat);
+    if (job.standardInput && !job.saveTask.empty()) throw failure(Msg::stdinRefuses, {"--save-task"});
 }
 
 void resolve(Given& given) {
@@ -64,6 +70,7 @@ void resolve(Given& given) {
     if (!given.channels.empty())
         job.channels = static_cast<int>(parseNumber(given.channels, 1, 8, "--channels"));
     if (!given.bits.empty()) job.bits = parseBits(given.bits);
+    takeStandardInput(given);
     choosePreset(job);
     checkMuxer(job);
 }
@@ -95,7 +102,10 @@ void addTranscode(CommandLine& line, Signals& signals, const std::string& versio
     Command command = line.command("transcode", "Read INPUTs, convert, and write OUTPUT");
     auto given = std::make_shared<Given>();
     JobOptions& job = given->job;
-    command.arguments("INPUT", job.inputs, "Files, or testgen:size=1280x720,rate=25,duration=10");
+    command.arguments("INPUT", job.inputs,
+                      "Files, testgen:size=1280x720,rate=25,duration=10, or - for the standard input");
+    command.option("--input-format", given->inputFormat,
+                   "What the standard input holds, as an extension: wav, ...", "EXT");
     command.option("-o,--output", job.output,
                    "What to write; the extension says how. - is the standard output", "FILE");
     command.option("--format", job.format, "What to write, in the place of an extension: wav, raw, ...",

@@ -116,9 +116,11 @@ void Job::begin(JobPlan plan) {
 // Next to a raw file there may be others, such as its sound.
 std::unique_ptr<Source> Job::openInput(const std::string& name) {
     const bool onlyOne = options_.inputs.size() == 1 && !options_.join;
-    const bool isRaw = onlyOne || !Source::describesItself(name);
+    StandardInput* const standard = name == StandardInput::kName ? options_.standardInput.get() : nullptr;
+    if (standard && options_.joins()) throw failure(Msg::stdinRefuses, {options_.join ? "--join" : "--cut"});
+    const bool isRaw = onlyOne || !Source::describesItself(standard ? name + "." + standard->format() : name);
     rawTaken_ |= isRaw;
-    auto source = std::make_unique<Source>(name, isRaw ? options_.raw : "");
+    auto source = std::make_unique<Source>(name, isRaw ? options_.raw : "", standard);
     source->selectAll();
     return source;
 }

@@ -1,16 +1,19 @@
 // What the user asks of a transcode: what it does, and how it is run.
 #pragma once
 
+#include <memory>
 #include <string>
 #include <vector>
 
 #include "tarsel/host/outputs/outputs.h"
+#include "tarsel/host/standardinput.h"
 #include "tarsel/job/plan/planoptions.h"
 #include "tarsel/job/progress.h"
 
 struct JobOptions : PlanOptions {
-    std::string raw;   // format of a raw input
-    std::string post;  // command that is run afterwards
+    std::string raw;                               // format of a raw input
+    std::shared_ptr<StandardInput> standardInput;  // read once, for all attempts; null when it is no input
+    std::string post;                              // command that is run afterwards
     ProgressMode progress;
     OutputPolicy policy{false};
     std::string presetName;  // a preset's name or symbol

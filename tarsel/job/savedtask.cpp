@@ -3,7 +3,9 @@
 #include <filesystem>
 
 #include "tarsel/job/task/storedtask.h"
+#include "tarsel/job/task/taskfiles.h"
 #include "tarsel/words/messages.h"
+#include "tarsel/words/xmlnames.h"
 
 namespace fs = std::filesystem;
 
@@ -35,6 +37,16 @@ AnyDict newState(const JobParts& parts, const JobOptions& options) {
     return state;
 }
 
+// A task has to find its files again.
+void requireNames(const AnyDict& state, const JobOptions& options) {
+    AnyDict looked = state;
+    changeTaskFiles(looked, [&](const std::string& name, TaskFileUse) {
+        if (!xmlKeeps(name)) throw failure(Msg::xmlNameLost, {options.saveTask, name});
+        return name;
+    });
+    if (!xmlKeeps(options.post)) throw failure(Msg::xmlNameLost, {options.saveTask, options.post});
+}
+
 }  // namespace
 
 void saveTask(JobParts& parts, const JobOptions& options, Signals& signals) {
@@ -47,6 +59,7 @@ void saveTask(JobParts& parts, const JobOptions& options, Signals& signals) {
         makeRelative(state, fs::path(options.saveTask).parent_path().string());
     else
         makeAbsolute(state);
+    requireNames(state, options);
     const std::string reason = writeTask(state, parts.outputs.beginTask());
     if (!reason.empty()) throw writeFailure(options.saveTask, parts.outputs.withFinalNames(reason));
 }

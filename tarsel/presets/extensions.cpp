@@ -19,7 +19,7 @@ constexpr PresetExtension kExtensions[] = {
     {"mpeg", "mpegpsmux", {"MPEG2_MAIN", "MPEG1"}},
     {"vob",  "mpegpsmux", {"DVD"}},
     {"mxf",  "mxfmux",    {"XDCAM_HD_422_1920", "VC3_GENERIC", "AVCINTRA_100"}},
-    {"dv",   "dv100mux",  {"DV", "DVCPRO50"}},
+    {"dv",   "dv100mux",  {"DV", "DVCPRO50"}, "dvmux"},
     {"mj2",  "mj2mux",    {"DCI_LOSSY"}},
     {"wmv",  "asfmux",    {"VC1_MAIN", "SILVERLIGHT_VC1"}},
     {"asf",  "asfmux",    {"VC1_MAIN", "SILVERLIGHT_VC1"}},

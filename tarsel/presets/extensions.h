@@ -9,6 +9,7 @@ struct PresetExtension {
     std::string_view extension;  // without the dot, in small letters
     const char* muxer;
     const char* symbols[most];  // of the presets, the first one that is installed is taken; null for none
+    const char* otherMuxer = nullptr;  // for presets that do not have the first one; null for none
 };
 
 std::span<const PresetExtension> presetExtensions();

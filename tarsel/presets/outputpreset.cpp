@@ -43,26 +43,24 @@ QvPreset withMuxer(const QvPreset& preset, const char* muxer) {
     return other;
 }
 
-// The presets of an extension, none of which is installed.
-Failure missing(const PresetExtension& row) {
-    return failure(Msg::outputNoPreset, {"x." + std::string(row.extension)});
+// The multiplexer with which a preset writes files of an extension; null if it does not.
+const char* muxerFor(const QvPreset& preset, const PresetExtension& row) {
+    for (const char* muxer : {row.muxer, row.otherMuxer})
+        if (muxer && preset.muxerAllowed(muxer)) return muxer;
+    return nullptr;
 }
 
-const PresetExtension* rowOf(const QvPreset& preset, const std::string& extension) {
-    const PresetExtension* const row = presetExtension(extension);
-    return row && preset.muxerAllowed(row->muxer) ? row : nullptr;
-}
-
-std::shared_ptr<const OutputPreset> byExtension(const PresetExtension& row, const std::string& muxer) {
+std::shared_ptr<const OutputPreset> byExtension(const PresetExtension& row, const std::string& muxer,
+                                                const std::string& output) {
     const QvPresetMgr& catalogue = *qvPresetMgr();
     for (const char* symbol : row.symbols) {
         const int index = symbol ? catalogue.findByProfile(qvSymToProfile(symbol)) : -1;
         if (index < 0) continue;
         const QvPreset preset = catalogue.builtinPreset(index);
-        if (preset.muxerAllowed(row.muxer))
-            return std::make_shared<OutputPreset>(preset, muxer.empty() ? row.muxer : muxer);
+        if (const char* const own = muxerFor(preset, row))
+            return std::make_shared<OutputPreset>(preset, muxer.empty() ? own : muxer);
     }
-    throw missing(row);
+    throw failure(Msg::outputNoPreset, {output});  // none of them is installed
 }
 
 }  // namespace
@@ -152,13 +150,14 @@ PresetSound OutputPreset::sound(const QvCodec& encoder, int number, bool fitted)
 }
 
 std::shared_ptr<const OutputPreset> outputPreset(const std::string& name, const std::string& extension,
-                                                 const std::string& muxer) {
+                                                 const std::string& muxer, const std::string& output) {
     if (name.empty()) {
         const PresetExtension* const row = presetExtension(extension);
-        return row ? byExtension(*row, muxer) : nullptr;
+        return row ? byExtension(*row, muxer, output) : nullptr;
     }
     const QvPreset preset = findPreset(name);
     const PresetExtension* const row =
-        muxer.empty() && preset.isBuiltin() ? rowOf(preset, extension) : nullptr;
-    return std::make_shared<OutputPreset>(preset, row ? row->muxer : muxer);
+        muxer.empty() && preset.isBuiltin() ? presetExtension(extension) : nullptr;
+    const char* const own = row ? muxerFor(preset, *row) : nullptr;
+    return std::make_shared<OutputPreset>(preset, own ? own : muxer);
 }

@@ -58,6 +58,7 @@ bool isRawEncoder(const QvCodec& encoder);
 bool isRawEncoderName(std::string_view name);
 
 // Of a job's options: the preset named, or, without a name, the first one that goes with the extension of an
-// output that nothing else writes; null for none. `muxer`: that of --muxer, or empty. Throws Failure.
+// output that nothing else writes; null for none. `muxer`: that of --muxer, or empty. `output`: its name as
+// the user gave it. Throws Failure.
 std::shared_ptr<const OutputPreset> outputPreset(const std::string& name, const std::string& extension,
-                                                 const std::string& muxer);
+                                                 const std::string& muxer, const std::string& output);

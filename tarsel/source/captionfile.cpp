@@ -32,10 +32,12 @@ QvFramerate readScc(const std::string& name, int field, const std::optional<QvFr
     return counting;
 }
 
-void refuseScc(const std::string& name) {
+void refuseScc(const std::string& name) { refuseScc(name, firstBytes(name, kSccHead)); }
+
+void refuseScc(const std::string& name, const std::string& head) {
     constexpr std::string_view kTitle = "Scenarist_SCC V1.0";
     constexpr std::string_view kMark = "\xEF\xBB\xBF";  // of UTF-8
-    const std::string head = firstBytes(name, kMark.size() + kTitle.size());
+    static_assert(kSccHead == kTitle.size() + kMark.size());
     std::string_view text = head;
     if (text.substr(0, kMark.size()) == kMark) text.remove_prefix(kMark.size());
     throw failure(text.substr(0, kTitle.size()) == kTitle ? Msg::inputNoCaptions : Msg::inputNoScc, {name});

@@ -1,6 +1,7 @@
 // Caption files as the tool reads them, and what one that is refused holds.
 #pragma once
 
+#include <cstddef>
 #include <optional>
 #include <string>
 
@@ -16,3 +17,6 @@ bool isSubtitleFile(const std::string& name);
 
 // Throws Failure (input) for a file that was refused as SCC: it is none, or has no caption lines.
 [[noreturn]] void refuseScc(const std::string& name);
+// The same of what begins with `head`, of kSccHead bytes where it has as many.
+[[noreturn]] void refuseScc(const std::string& name, const std::string& head);
+inline constexpr size_t kSccHead = 21;  // the title and the mark of UTF-8

@@ -37,7 +37,9 @@ AnyDict mixOf(const std::string& name, const AnyDict& mono) {
     AnyVector channels;
     for (const Any& entry : mono.getVector("channels")) {
         const Any& file = entry.asDict().get("src");
-        const Any path = QvFile::isAbsolutePath(file) ? file : QvFile::joinPath(folder, file);
+        // An empty name is refused with the set-up.
+        const bool whole = file.size() == 0 || QvFile::isAbsolutePath(file);
+        const Any path = whole ? file : QvFile::joinPath(folder, file);
         AnyDict channel("source",
                         AnyVector(Any(AnyDict("src", path, "stream", 0, "channel", 0, "weight", 1.0))));
         const Any& position = entry.asDict().get("pos");

@@ -7,6 +7,7 @@
 #include "tarsel/host/events.h"
 #include "tarsel/host/files.h"
 #include "tarsel/host/memory.h"
+#include "tarsel/host/standardinput.h"
 #include "tarsel/source/captionfile.h"
 #include "tarsel/source/mixfile.h"
 #include "tarsel/source/picturefile.h"
@@ -129,11 +130,15 @@ AnyDict stateOf(const QvCodec& codec) {
     return state;
 }
 
-Source::Source(const std::string& spec, const std::string& raw) : name_(spec) {
+Source::Source(const std::string& spec, const std::string& raw, StandardInput* standard)
+    : name_(spec), formatName_(spec) {
     if (isGenerator(spec)) {
         isFile_ = false;
         if (!raw.empty()) throw failure(Msg::rawNoFile, {spec});
         openGenerator(spec);
+    } else if (spec == StandardInput::kName) {
+        takeStandard(standard, !raw.empty());
+        raw.empty() ? openFile() : openRaw(raw);
     } else {
         files_.push_back(spec);
         requireInput(spec);
@@ -155,6 +160,19 @@ Source::Source(QvDecodePipe& decoder) : open_(&decoder) {
 
 Source::Source(const std::string& name, std::unique_ptr<QvDecodePipe> decoder)
     : name_(name), isFile_(false), decoder_(std::move(decoder)), open_(decoder_.get()) {}
+
+void Source::takeStandard(StandardInput* standard, bool isRaw) {
+    if (!standard) throw failure(Msg::stdinNotTaken, {name_});
+    const std::string& format = standard->format();
+    if (format.empty() && !isRaw) throw failure(Msg::stdinNoFormat, {name_});
+    if (!format.empty()) formatName_ += "." + format;
+    if (isMixName(formatName_) || QvFile::getExt(Any(formatName_.c_str()), true) == "xml")
+        throw failure(Msg::stdinIsDocument, {"--input-format " + format});
+    isFile_ = false;
+    standard->take();
+    standard_ = standard;
+    if (!standard->file().empty()) files_.push_back(standard->file());
+}
 
 bool Source::describesItself(const std::string& spec) {
     if (isGenerator(spec)) return true;
@@ -215,7 +233,7 @@ void Source::openRaw(const std::string& raw) {
     const std::string option = "--raw";
     const KeyValues keys(raw, kRawKeys, option);
     const std::string *size = keys.find("size"), *pixel = keys.find("pixel"), *rate = keys.find("rate");
-    const std::string extension = extensionOf(name_);
+    const std::string extension = extensionOf(formatName_);
     const RawName* name = rawName(extension);
     if (!size || (!pixel && !openName(extension) && (!name || name->fourcc == 0)))
         throw failure(Msg::rawIncomplete);
@@ -227,7 +245,11 @@ void Source::openRaw(const std::string& raw) {
     if (name && !nameAllows(*name, fourcc, true))
         throw failure(Msg::rawNameSays, {*pixel, name_, fourccText(name->fourcc)});
     requireFrame(option + " size", fourcc, dimensions.width, dimensions.height);
-    setChecked(d, "filename", name_.c_str(), option);
+    setChecked(d, "filename", formatName_.c_str(), option);
+    if (standard_) {
+        bytes_ = standard_->source();
+        setChecked(d, qvSourceParam, qvSourceValue(bytes_.get()), option);
+    }
     setChecked(d, "FOURCC", static_cast<int>(fourcc), option + " pixel");
     setChecked(d, "width", dimensions.width, option + " size");
     setChecked(d, "height", dimensions.height, option + " size");
@@ -271,19 +293,27 @@ Any openParameters(const std::string& name) {
 
 }  // namespace
 
-// Why the best decoder refuses the file. The factory keeps only its name, so it is asked once more.
-void Source::refuseFile(const std::string& decoder) const {
-    const std::unique_ptr<QvCodec> codec(qv_registry()->newCodec(decoder.c_str()));
-    if (!codec) throw failure(Msg::inputNoDecoder, {name_});
-    if (decoder == "sccdec" || decoder == "wavdec") codec->setParam("openParameters", openParameters(name_));
-    codec->setParam("filename", name_.c_str());
-    const bool opens = codec->open() == QvStatus::ok;
-    firstBytes(name_, 1);  // a disk that fails is no fault of the format
-    if (decoder == "wavdec") refuseWav(name_);
-    if (decoder == "sccdec") refuseScc(name_);
-    const Any ext = QvFile::getExt(Any(name_.c_str()), true);
+std::string Source::head(size_t most) const {
+    return standard_ ? standard_->firstBytes(most) : firstBytes(name_, most);
+}
+
+// Why the best decoder refuses it. The factory keeps only the name of a file, so that one is asked once more.
+void Source::refuseFile(const std::string& decoder, const std::string& reason) const {
+    std::string why = reason;
+    if (!standard_) {
+        const std::unique_ptr<QvCodec> codec(qv_registry()->newCodec(decoder.c_str()));
+        if (!codec) throw failure(Msg::inputNoDecoder, {name_});
+        if (decoder == "sccdec" || decoder == "wavdec")
+            codec->setParam("openParameters", openParameters(name_));
+        codec->setParam("filename", name_.c_str());
+        if (codec->open() != QvStatus::ok) why = codec->errorDesc();
+    }
+    head(1);  // a disk that fails is no fault of the format
+    if (decoder == "wavdec") refuseWav(name_, head(kWavHead));
+    if (decoder == "sccdec") refuseScc(name_, head(kSccHead));
+    const Any ext = QvFile::getExt(Any(formatName_.c_str()), true);
     if (ext == "srt" || ext == "sub") throw failure(Msg::inputNoSubtitles, {name_});
-    refuse(opens || !*codec->errorDesc() ? "no decoder can read it" : codec->errorDesc());
+    refuse(why.empty() ? "no decoder can read it" : why);
 }
 
 void Source::takeMixed() {
@@ -292,26 +322,48 @@ void Source::takeMixed() {
 }
 
 void Source::openFile() {
-    if (isMixName(name_)) decoder_ = openMix(name_);
+    if (isMixName(formatName_)) decoder_ = openMix(name_);
     if (decoder_) return;
-    const Any ext = QvFile::getExt(Any(name_.c_str()), true);
-    const Any params = openParameters(name_);
-    decoder_.reset(
-        QvDecFactory::decodePipe(Any(name_.c_str()), Any(), nullptr, params.isValid() ? &params : nullptr));
-    if (decoder_) return;
-    if (isMixName(name_)) readMix(name_);  // which refuses it
-    const AnyVector candidates = qv_registry()->decoders(ext.asString());
-    const std::unique_ptr<AnyVector> exts(qv_registry()->inputExts(false, false));
-    if (candidates.empty()) {
-        for (int i = 0; i < exts->size(); ++i)
-            if (exts->at(i) == ext) throw failure(Msg::inputIsRaw, {name_});
-        if (rawName(ext.asString("")) || openName(ext.asString(""))) throw failure(Msg::inputIsRaw, {name_});
-        throw failure(Msg::inputUnknown, {name_, ext.asString()});
+    const Any params = openParameters(formatName_);
+    Any error;
+    if (standard_) {
+        requireDecoder();
+        AnyDict given;
+        if (params.isValid()) given.set("openParameters", params);
+        decoder_.reset(
+            QvDecFactory::decodeSource(standard_->source(), Any(formatName_.c_str()), given, &error));
+    } else {
+        decoder_.reset(QvDecFactory::decodePipe(Any(name_.c_str()), Any(), nullptr,
+                                                params.isValid() ? &params : nullptr));
     }
-    refuseFile(candidates.at(0).asString());
+    if (decoder_) return;
+    if (isMixName(formatName_)) readMix(name_);  // which refuses it
+    refuseFile(requireDecoder(), error.asString(""));
 }
 
-long long Source::bytes() const { return isFile_ ? fileBytes(name_) : -1; }
+// The best decoder for its extension.
+std::string Source::requireDecoder() const {
+    const Any ext = QvFile::getExt(Any(formatName_.c_str()), true);
+    const AnyVector candidates = qv_registry()->decoders(ext.asString());
+    if (!candidates.empty()) return candidates.at(0).asString();
+    const std::unique_ptr<AnyVector> exts(qv_registry()->inputExts(false, false));
+    for (int i = 0; i < exts->size(); ++i)
+        if (exts->at(i) == ext) throw failure(Msg::inputIsRaw, {name_});
+    if (rawName(ext.asString("")) || openName(ext.asString(""))) throw failure(Msg::inputIsRaw, {name_});
+    throw failure(Msg::inputUnknown, {name_, ext.asString()});
+}
+
+std::string Source::decoderName() const {
+    if (!standard_) return open_->name();
+    // What reads bytes of memory names the decoder that it has made.
+    const Any inner = open_->QvCodec::getParam("decoder");
+    return inner.isText() ? inner.toString().asString("") : open_->name();
+}
+
+long long Source::bytes() const {
+    if (standard_) return standard_->bytes();
+    return isFile_ ? fileBytes(name_) : -1;
+}
 
 std::optional<QvFramerate> Source::frameRate() const {
     if (open_->nrStreams(1) == 0) return std::nullopt;

@@ -8,11 +8,14 @@
 
 #include <qvplugcore/qvplugcore.h>
 
+class StandardInput;
+
 class Source {
   public:
-    // `spec`: a file name, or "testgen:size=1280x720,rate=25,duration=10". `raw`: the format of a raw file
+    // `spec`: a file name, "testgen:size=1280x720,rate=25,duration=10", or "-" for `standard`, which then
+    // outlives this; null where the standard input is not taken. `raw`: the format of a raw file
     // ("size=352x288,pixel=I420,rate=25"), empty to open by extension. Throws Failure.
-    Source(const std::string& spec, const std::string& raw);
+    Source(const std::string& spec, const std::string& raw, StandardInput* standard = nullptr);
     // One that is open already; it has to outlive this.
     explicit Source(QvDecodePipe& decoder);
     // The same for a decoder that reads others.
@@ -26,8 +29,10 @@ class Source {
     static bool isGenerator(const std::string& spec);
 
     QvDecodePipe& decoder() const { return *open_; }
+    // The module that reads it.
+    std::string decoderName() const;
     const std::string& name() const { return name_; }
-    // Bytes of the file; negative when it is none.
+    // Bytes of the file or the standard input; negative for others.
     long long bytes() const;
     bool isFile() const { return isFile_; }
     // What is read: the file and what it names, or the picture that the generator shows.
@@ -47,13 +52,19 @@ class Source {
     void openGenerator(const std::string& spec);
     void openRaw(const std::string& raw);
     void openFile();
+    void takeStandard(StandardInput* standard, bool isRaw);
     void takeMixed();  // the files of a mix
-    [[noreturn]] void refuseFile(const std::string& decoder) const;
+    std::string requireDecoder() const;
+    [[noreturn]] void refuseFile(const std::string& decoder, const std::string& reason) const;
+    std::string head(size_t most) const;  // its first bytes
     [[noreturn]] void refuse(const std::string& why) const;
 
     std::string name_;
+    std::string formatName_;  // whose extension says what it holds
     bool isFile_ = true;
     std::vector<std::string> files_;
+    StandardInput* standard_ = nullptr;
+    std::unique_ptr<QvByteSource> bytes_;    // outlives the decoder that reads it
     std::unique_ptr<QvDecodePipe> decoder_;  // null where it belongs to another
     QvDecodePipe* open_ = nullptr;
 };

@@ -5,13 +5,11 @@
 #include <optional>
 #include <string_view>
 
-#include "tarsel/host/files.h"
 #include "tarsel/words/messages.h"
 
 namespace {
 
 constexpr unsigned kExtensible = 0xFFFE;
-constexpr size_t kHead = 1 << 16;  // bytes in which the format stands, but for odd files
 constexpr const char* kReadable = "PCM of 1 to 32 bits, float, A-law and mu-law of 1 to 256 channels";
 constexpr unsigned kMostChannels = 256;
 
@@ -115,8 +113,8 @@ bool readable(const Format& format) {
 
 }  // namespace
 
-void refuseWav(const std::string& name) {
-    const std::string head = firstBytes(name, kHead), form = formOf(head);
+void refuseWav(const std::string& name, const std::string& head) {
+    const std::string form = formOf(head);
     const bool wave = form == "RIFFWAVE" || form == "RIFXWAVE" || form == "RF64WAVE" || form == "BW64WAVE";
     if (!wave) throw failure(Msg::inputNotWav, {name});
     const auto format = formatOf(head);

@@ -1,13 +1,18 @@
-// A plug-in with a video encoder under a name that presets wait for. It writes a line of text for each
-// picture, and takes few sizes and rates. A preset of its own leaves the choice between two multiplexers.
+// A plug-in with a video encoder under names that presets wait for. It writes a line of text for each
+// picture, and takes few sizes and rates. "dvmux" can be planned with. A preset of its own leaves the
+// choice between two multiplexers.
+#include <memory>
 #include <string>
+#include <utility>
 
+#include "core/encode/basemuxer.h"
 #include "core/encode/qvencoder.h"
 #include "core/engine/modules/qvmodule.h"
 #include "core/engine/modules/qvplugin.h"
 #include "core/measure/fourcc.h"
 #include "core/measure/qvframerate.h"
 #include "core/media/qvbuffer.h"
+#include "core/stream/file/qvfilebufstream.h"
 #include "core/stream/qvbufstrm.h"
 
 namespace {
@@ -63,8 +68,25 @@ class LineEncoder : public QvVideoEncoder {
 };
 
 struct Module : QvModule {
-    Module() : QvModule(QvModuleType::videoEncoder, "h264venc", "of a test", "Lines") {}
+    explicit Module(const char* name) : QvModule(QvModuleType::videoEncoder, name, "of a test", "Lines") {}
     QvCodec* create() override { return _setAttrs(new LineEncoder); }
+};
+
+// Takes streams and writes none of them: for plans.
+class Planned : public BaseMuxer {
+  public:
+    QvBufStream* addStream(int type, const AnyDict&) override {
+        auto stream = std::make_unique<QvNullBufStream>();
+        stream->setOwner(this);
+        return keep(type, std::move(stream));
+    }
+    int open() override { return QvStatus::ok; }
+    int close() override { return QvStatus::ok; }
+};
+
+struct Multiplexer : QvModule {
+    Multiplexer() : QvModule(QvModuleType::muxer, "dvmux", "of a test", "DV") {}
+    QvCodec* create() override { return _setAttrs(new Planned); }
 };
 
 }  // namespace
@@ -75,7 +97,11 @@ QV_API unsigned qv_plugin_abi = qvPluginAbi;
 
 extern "C" QV_API QvPlugin* plugin_init() {
     static QvPlugin plugin("lines", "An encoder that presets wait for");
-    if (plugin.nrModules() == 0) plugin.addModule(new Module);
+    if (plugin.nrModules() == 0) {
+        plugin.addModule(new Module("h264venc"));
+        plugin.addModule(new Module("dvvenc"));
+        plugin.addModule(new Multiplexer);
+    }
     AnyDict preset("profile", 0x2800010, "name", "Two ways", "group", "Tests", "video", "rawvenc");
     preset.set("audio", "rawaenc");
     preset.set("muxers", AnyVector("rawmux", "rawavimux"));

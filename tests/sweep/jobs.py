@@ -34,6 +34,8 @@ JOBS = [
     Job("avi", card("--pixel", "I420", "-o", "card.avi"), card("--pixel", "YUYV", "-o", "card.avi")),
     Job("preset", card("--preset", "Uncompressed AVI", "--match", "--pixel", "I420", "-o", "made.avi"),
         card("--pixel", "YUYV", "-o", "made.avi")),
+    Job("presets", ["presets", "save", "Web", "--size", "64x48", "--overwrite"],
+        ["presets", "save", "Web", "--size", "320x240", "--overwrite"]),
     Job("pictures", card("-o", "card.png"), card("-o", "card.png", length=0.28, size="48x64")),
     Job("channels", ["transcode", "in.wav", "--split-channels", "-o", "ch.wav", "-y"],
         ["transcode", "in3.wav", "--split-channels", "-o", "ch.wav", "-y"]),

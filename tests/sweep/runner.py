@@ -16,6 +16,9 @@ PATIENCE = 60  # seconds; a run that takes longer hangs
 INTERNAL = re.compile(r"\b[Qq]v[A-Z_]|::|bad_alloc|\.tarsel-|[Aa]ssert")  # names of temporary folders may have "qv"
 CRASH = re.compile(r"Sanitizer|runtime error|terminate called|core dumped")
 ASIDE = ("tarsel: warning: ", "tarsel: wrote ", "tarsel: stopping; ")
+SETTINGS = "settings"  # of the user
+# A lock stays, and what a killed run has not finished there goes with the next one.
+UNFINISHED = (f"{SETTINGS}/presets.xml.lock", f"{SETTINGS}/presets.xml.new")
 STOPPED = {signal.SIGHUP: 129, signal.SIGINT: 130, signal.SIGTERM: 143}
 
 
@@ -31,7 +34,8 @@ class Outcome:
 
 
 class Box:
-    """A folder with the inputs, in which the tool runs; `w` is the working folder and `tmp` the home."""
+    """A folder with the inputs, in which the tool runs; `w` is the working folder and `tmp` the home. The user's
+    settings lie in the working folder: they are a result like others."""
 
     def __init__(self, sweep):
         self.sweep = sweep
@@ -41,6 +45,8 @@ class Box:
         self.work, self.temporary = self.root / "w", self.root / "tmp"
         self.work.mkdir()
         self.temporary.mkdir()
+        (self.work / SETTINGS).mkdir()
+        (self.temporary / ".QVTarselSdk").symlink_to(self.work / SETTINGS)
         for name, data in self.sweep.inputs.items():
             (self.work / name).write_bytes(data)
         return self
@@ -50,6 +56,7 @@ class Box:
 
     def lay(self, files):
         for name, data in files.items():
+            (self.work / name).parent.mkdir(exist_ok=True)
             (self.work / name).write_bytes(data)
 
     def start(self, arguments, variables=None, wrap=(), **streams):
@@ -82,7 +89,7 @@ class Box:
         found = {f"the input {name}": b"gone" for name in self.sweep.inputs if not (self.work / name).exists()}
         for path in sorted(self.work.rglob("*")):
             name = str(path.relative_to(self.work))
-            if path.is_file() and not path.is_symlink() and not name.startswith(".tarsel"):
+            if path.is_file() and not path.is_symlink() and not name.startswith((".tarsel", *UNFINISHED)):
                 data = path.read_bytes()
                 if self.sweep.inputs.get(name) != data:
                     found[name] = data.replace(str(self.root).encode(), b"BOX")
@@ -140,6 +147,8 @@ def judged(box, outcome, job, litter=True):
             return f"fails (status {outcome.status}) and leaves what is {wrong}"
     if litter and box.litter():
         return f"leaves {', '.join(box.litter())} (status {outcome.status})"
+    if litter and (box.work / UNFINISHED[1]).exists():
+        return f"leaves {UNFINISHED[1]} (status {outcome.status})"
     return wording(outcome) if outcome.status != 0 else None
 
 

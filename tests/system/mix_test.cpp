@@ -1,4 +1,6 @@
 // Mixes of sounds: made, shown, and used as inputs.
+#include <sys/stat.h>
+
 #include <nlohmann/json.hpp>
 
 #include "tests/system/tool.h"
@@ -84,6 +86,32 @@ TEST_F(Mix, FilesMayHaveSignsInTheirNames) {
     EXPECT_EQ(sources[2]["weight"], -2.0);
 }
 
+// What the file would not keep is not written into it.
+TEST_F(Mix, NamesAndWeightsComeBack) {
+    for (const char* name : {"line\nend.wav", "tab\t.wav", "cr\r.wav", "bell\a.wav", "latin\xE4.wav",
+                             "surrogate\xED\xA0\x80.wav", "none\xEF\xBF\xBF.wav"}) {
+        makeWav(name, 10, 1, 16, 48000);
+        fails(2, {"mix", "--ch", std::string("L=") + name, "-o", "x.mmf"}, {"'x.mmf'", "XML"});
+    }
+    fails(2, {"mix", "--ch", "L\nR=a.wav", "-o", "x.mmf"}, {"'x.mmf'", "XML"});
+    for (const char* name : {"two  blanks .wav", " \xC3\xA4'\"&<>.wav", "back\\slash.wav", "C:\\x.wav"}) {
+        makeWav(name, 10, 1, 16, 48000);
+        works({"mix", "--ch", std::string("L=") + name, "-o", "x.mmf", "-y"});
+        EXPECT_EQ(nlohmann::json::parse(works({"mix", "x.mmf", "--json"}).out)["samples"], 10) << name;
+    }
+    const struct {
+        const char *weight, *warning;
+    } rows[] = {{"0.333", ""},
+                {"32767", ""},
+                {"0.0001", "0.0001 became 0.000"},
+                {"-0.33333", "-0.33333 became -0.333"}};
+    for (const auto& row : rows) {
+        const Outcome o = works({"mix", "--ch", std::string("L=a.wav*") + row.weight, "-o", "x.mmf", "-y"});
+        EXPECT_EQ(o.err.find("warning") != std::string::npos, *row.warning != 0) << o.err;
+        EXPECT_THAT(o.err, testing::HasSubstr(row.warning));
+    }
+}
+
 TEST_F(Mix, AListOfMonoFilesIsAMix) {
     std::filesystem::create_directory(folder.file("sub"));
     makeWav("sub/r.wav", 1000, 1, 16, 48000);
@@ -105,6 +133,7 @@ TEST_F(Mix, InputsThatFailAreNamed) {
     folder.write("bad.wav", "RIFFnothing");
     makeWav("short.wav", 100, 1, 16, 48000);
     std::filesystem::resize_file(folder.file("short.wav"), 144);
+    for (const char* pipe : {"pipe.wav", "pipe.mmf"}) ASSERT_EQ(mkfifo(folder.file(pipe).c_str(), 0600), 0);
     const struct {
         const char* name;
         std::string element;
@@ -120,6 +149,16 @@ TEST_F(Mix, InputsThatFailAreNamed) {
         {"stream.mmf", source + "<src file='b.wav' stream='1' channel='0'/>" + end, {"stream number 1"}},
         {"self.mmf", source + "<src file='self.mmf' channel='0'/>" + end, {"self.mmf", "an input of itself"}},
         {"damaged.mmf", source + "<src/>" + end, {"damaged.mmf", "without 'file'"}},
+        {"unnamed.mmf", source + "<src file='' channel='0'/>" + end, {"unnamed.mmf", "an empty file name"}},
+        {"mono.mmf",
+         "<MonoInterleave><channels><ch src=''/></channels></MonoInterleave>",
+         {"mono.mmf", "names no file"}},
+        {"waits.mmf",
+         source + "<src file='pipe.wav' channel='0'/>" + end,
+         {"waits.mmf", "pipe.wav", "no regular file"}},
+        {"waits2.mmf",
+         source + "<src file='pipe.mmf' channel='0'/>" + end,
+         {"waits2.mmf", "pipe.mmf", "no regular file"}},
         {"other.mmf", "<Views/>", {"other.mmf", "no mix"}},
         {"open.mmf", "<Views>", {"open.mmf", "line"}},
         {"short.mmf",

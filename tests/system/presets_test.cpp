@@ -260,6 +260,12 @@ TEST_F(Presets, GiveAnOutputWhatTheOptionsLeaveOpen) {
     EXPECT_TRUE(contents("a.raw") == contents("b.raw") && contents("a.wav") == contents("b.wav"));
 }
 
+TEST_F(Presets, OneWithoutStreamsWritesNothing) {
+    works({"presets", "save", "Bare", "--no-video", "--no-audio"});
+    fails(2, {"transcode", "testgen:duration=0.1", "--preset", "bare", "-o", "x.raw"},
+          {"the preset 'Bare' has neither picture nor sound", "'x.raw'"});
+}
+
 TEST_F(Presets, LightUpWithTheModulesOfPlugins) {
     const auto names = [&](const Words& words) {
         std::set<std::string> all;
@@ -272,7 +278,7 @@ TEST_F(Presets, LightUpWithTheModulesOfPlugins) {
     EXPECT_TRUE(lit.contains("H264_HIGH") && !lit.contains("MPEG2_MAIN"));
     EXPECT_EQ(json::parse(works({"presets", "--all", "--json"}).out).size(), 98u);
     const Words job = {"transcode", "testgen:size=640x360,rate=50,duration=0.2", "--no-audio"};
-    fails(5, job + Words{"-o", "x.h264"}, {"'x.h264'", "presets list --all"});
+    fails(5, job + Words{"-o", "clip.h264"}, {"'clip.h264'", "presets list --all"});
     // By its extension; the encoder's own format, and what the options or the input ask for.
     works(coded(job + Words{"-o", "x.h264"}));
     EXPECT_EQ(contents("x.h264"), "320x240\n320x240\n320x240\n320x240\n320x240\n");
@@ -285,6 +291,8 @@ TEST_F(Presets, LightUpWithTheModulesOfPlugins) {
         failsAs(2, tarsel(coded(job + options + Words{"-o", "w.h264"})),
                 {options[0], "'h264venc'", "--match"}, options[0]);
     fails(2, coded(job + Words{"-o", "w.yuv", "--preset", "h.264 main"}), {"'w.yuv'"});
+    // The other multiplexer of an extension does where the first one is missing.
+    EXPECT_THAT(works(coded(job + Words{"-o", "x.dv", "--dry-run"})).out, HasSubstr("dvmux"));
     works(coded({"presets", "save", "Small", "--preset", "h264_high", "--size", "64x48"}));
     works(coded(job + Words{"-o", "s.h264", "--preset", "small"}));
     EXPECT_EQ(contents("s.h264").substr(0, 6), "64x48\n");

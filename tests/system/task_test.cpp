@@ -3,6 +3,8 @@
 
 namespace {
 
+using SavedNames = Tool;
+
 using testing::HasSubstr;
 using testing::Not;
 
@@ -239,6 +241,21 @@ TEST_F(Task, TheNullDeviceTakesEveryForm) {
         const auto before = listing();
         works({"run", "job.xml", "-o", "/dev/null"});
         EXPECT_EQ(listing(), before) << form.front();
+    }
+}
+
+// What the task would not find again is not written.
+TEST_F(SavedNames, ComeBackOrAreRefused) {
+    for (const char* name : {"cr\r.wav", "bell\a.wav", "latin\xE4.wav", "none\xEF\xBF\xBF.wav"}) {
+        makeWav(name, 10);
+        fails(2, {"transcode", name, "-o", "out.wav", "--save-task", "t.xml"}, {"'t.xml'", "XML"});
+    }
+    fails(2, {"transcode", "bell\a.wav", "-o", "out.wav", "--save-task", "t.xml", "--dry-run"}, {"'t.xml'"});
+    for (const char* name : {"line\nend.wav", "tab\t.wav", " two  '\"&<>\xC3\xA4 .wav"}) {
+        makeWav(name, 10);
+        works({"transcode", name, "-o", "out.wav", "--save-task", "t.xml", "-y"});
+        works({"run", "t.xml", "-y"});
+        EXPECT_EQ(wavPart(contents("out.wav"), "data"), wavPart(contents(name), "data")) << name;
     }
 }
 

@@ -84,6 +84,9 @@ std::unique_ptr<QvDecodePipe> Interleave::openDecoder(int file, const Any* param
     MixNesting::takeFailure();
     if (!MixNesting::addInput()) {
         reason.text = "more than " + std::to_string(MixNesting::maxInputs) + " inputs";
+    } else if (QvFile::isFile(name) && QvFile::flength(name) < 0) {
+        // Opening a pipe would wait for its writer.
+        reason.text = "it can't be read, or is no regular file";
     } else if (const char* module = setup.decoder(file)) {
         qv_dbg()->info("Using decoder '%s' to open %s", module, shown(name).c_str());
         decoder.reset(QvDecFactory::decodePipeUsing(name, AnyVector(Any(module)), Any(), &reason, params));

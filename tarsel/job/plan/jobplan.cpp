@@ -64,6 +64,8 @@ void checkKinds(JobPlan& plan, const PlanOptions& options) {
     OutputForm& output = plan.output;
     if (plan.streams.empty() && (options.noVideo || options.noAudio))
         throw failure(Msg::inputUnwanted, {options.noAudio ? "--no-audio" : "--no-video", output.name});
+    if (plan.preset && !plan.preset->has(qvVideoStream) && !plan.preset->has(qvAudioStream))
+        throw failure(Msg::presetEmpty, {plan.preset->name(), output.name});
     if (plan.streams.empty())
         throw failure(output.kind == OutputKind::wav ? Msg::inputNoSound : Msg::inputNoStreams,
                       {output.name});

@@ -112,6 +112,12 @@ TEST_F(Metafile, DamagedElements) {
          "Interleave: invalid filters node"},
         {"<AudioInterleave><channels><ch><src file='a'/></ch></channels></AudioInterleave>", nullptr},
         {"<AudioInterleave><channels><ch><src channel='0'/></ch></channels></AudioInterleave>", nullptr},
+        {"<AudioInterleave><channels><ch><src file='' channel='0'/></ch></channels></AudioInterleave>",
+         nullptr},
+        {"<AudioInterleave><channels/><decoders><dec file='' decoder='d'/></decoders></AudioInterleave>",
+         nullptr},
+        {"<AudioInterleave><channels/><filters><s file='' streamNr='0'><f/></s></filters></AudioInterleave>",
+         nullptr},
         {"<Metafile/>", nullptr},
         {"<vec><Metafile><Metafile/></Metafile></vec>", nullptr},
     };

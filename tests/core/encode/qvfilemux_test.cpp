@@ -113,6 +113,7 @@ TEST_F(FileMuxCheck, RefusesWhatItCanNotRun) {
         EXPECT_EQ(mux.filesWritten().size(), 0);
         return std::string(mux.errorDesc());
     };
+    EXPECT_EQ(run(nullptr, out), "There is no multiplexer");
     EXPECT_EQ(run("absent", out), "There is no multiplexer absent");
     EXPECT_EQ(run("wavdec", out), "There is no multiplexer wavdec");
     EXPECT_EQ(run("memmux", out), "memmux does not multiplex files");

@@ -169,6 +169,24 @@ TEST(Init, BringsTheBuiltinModulesUpAndDown) {
     registry.setConfig(AnyDict());
 }
 
+// The record counts from its fourth word on.
+TEST(QvRegistry, LendsItsExternalIO) {
+    QvRegistry& registry = *qv_registry();
+    int place = 0;
+    QvExternalIO io;
+    for (void*& word : io.words) word = &place;
+    io.words[3] = nullptr;
+    registry.setExternalDecoderIO(&io);
+    EXPECT_EQ(registry.externalDecoderIO(), nullptr);
+    io.words[3] = &io;
+    registry.setExternalDecoderIO(&io);
+    const QvExternalIO* const lent = registry.externalDecoderIO();
+    ASSERT_TRUE(lent && lent != &io);
+    EXPECT_TRUE(std::equal(std::begin(io.words), std::end(io.words), lent->words));
+    registry.setExternalDecoderIO(nullptr);
+    EXPECT_EQ(registry.externalDecoderIO(), nullptr);
+}
+
 TEST(Init, CallbackAndCleanup) {
     const TempFolder folder;
     LogCapture receiver;
