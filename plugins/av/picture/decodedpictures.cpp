@@ -34,7 +34,11 @@ bool DecodedPictures::openCodec(int threads, std::string& reason) {
     const AVCodecParameters& parameters = *stream().codecpar;
     const AVCodec* const decoder = avcodec_find_decoder(parameters.codec_id);
     if (!decoder) {
-        reason = std::string("there is no decoder for ") + avcodec_get_name(parameters.codec_id);
+        char tag[AV_FOURCC_MAX_STRING_SIZE] = {};
+        const bool known = parameters.codec_id != AV_CODEC_ID_NONE;
+        reason = std::string("there is no decoder for ") +
+                 (known ? avcodec_get_name(parameters.codec_id)
+                        : av_fourcc_make_string(tag, parameters.codec_tag));
         return false;
     }
     codec_.reset(avcodec_alloc_context3(decoder));

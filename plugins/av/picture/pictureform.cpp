@@ -128,7 +128,8 @@ PictureForm formOf(AVPixelFormat format, bool fullRange) {
     if (!fullRange && (planes || pairs) && isPlain(*layout, format) &&
         layout->log2_chroma_h == (planes ? 1 : 0))
         form.from = format;
-    if (form.fourcc == QvFourcc::YUYV && format == AV_PIX_FMT_YUYV422 && !fullRange) form.from = format;
+    else if (form.fourcc == QvFourcc::YUYV)
+        form.from = AV_PIX_FMT_YUYV422;
     if (form.fourcc == QvFourcc::W016 || form.fourcc == QvFourcc::Y216) form.shift = 16 - depthOf(form.from);
     const bool yuv = planes || pairs;
     if (format == form.from) return form;

@@ -20,6 +20,13 @@ constexpr std::size_t notShown = static_cast<std::size_t>(-1);
 constexpr int longestStepOfBroadcast = 10;  // seconds
 constexpr int longestStepOfFile = 30 * 60 * 60;
 
+// Whether pictures that are not referred to are presented as soon as they are decoded, so that the order of
+// presentation follows from the times of decoding.
+bool refersToNeighbours(AVCodecID codec) {
+    return codec == AV_CODEC_ID_MPEG1VIDEO || codec == AV_CODEC_ID_MPEG2VIDEO || codec == AV_CODEC_ID_MPEG4 ||
+           codec == AV_CODEC_ID_VC1;
+}
+
 Rational rational(AVRational r) { return {r.num, r.den}; }
 
 }  // namespace
@@ -78,10 +85,12 @@ bool PictureReader::Decoding::hasTimes() const {
     const AVCodecDescriptor* const codec = avcodec_descriptor_get(source_->codec().codec_id);
     if (!codec || !(codec->props & AV_CODEC_PROP_REORDER)) return true;
     const auto& packets = source_->packets();
-    const auto without = std::count_if(packets.begin(), packets.end(), [](const IndexedPacket& packet) {
-        return packet.pts == AV_NOPTS_VALUE;
-    });
-    return without * 10 <= static_cast<std::ptrdiff_t>(packets.size());
+    const auto without = static_cast<std::size_t>(
+        std::count_if(packets.begin(), packets.end(),
+                      [](const IndexedPacket& packet) { return packet.pts == AV_NOPTS_VALUE; }));
+    // Without a container all times are guesses as soon as one is missing.
+    const bool bare = (source_->container().iformat->flags & AVFMT_GENERIC_INDEX) != 0;
+    return without == 0 || (!bare && refersToNeighbours(source_->codec().codec_id));
 }
 
 // Without times only the codec knows the order of presentation: it decodes the stream once.

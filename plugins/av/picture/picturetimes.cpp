@@ -19,9 +19,11 @@ double number(Rational r) { return static_cast<double>(r.num) / static_cast<doub
 
 // Times are rounded to units, the first one too: a unit of difference is no variation where units are fine.
 // Where a picture lasts for a few units only, half a unit has to do.
+double slack(double period) { return period >= 4 ? 1.0 : 0.5; }
+
 bool isConstant(const std::vector<TimedPicture>& pictures, Rational base, Rational rate) {
     const double period = 1.0 / (number(rate) * number(base));  // in units
-    const double allowed = (period >= 4 ? 1.0 : 0.5) + 1e-6;
+    const double allowed = slack(period) + 1e-6;
     const std::int64_t first = pictures.front().time;
     for (std::size_t i = 1; i < pictures.size(); ++i)
         if (std::fabs(static_cast<double>(pictures[i].time - first) - static_cast<double>(i) * period) >
@@ -86,6 +88,20 @@ Rational nearestUsual(double mean) {
     });
 }
 
+// Of a picture only the time of decoding is known: it is presented when the next picture is decoded that
+// later ones refer to. One that is presented as soon as it is decoded is none of these.
+std::int64_t presentation(const std::vector<IndexedPacket>& packets, std::size_t of, std::int64_t duration) {
+    constexpr std::size_t mostReordered = 32;
+    std::int64_t latest = packets[of].dts;
+    const std::size_t end = std::min(packets.size(), of + mostReordered);
+    for (std::size_t i = of + 1; i < end; ++i) {
+        if (packets[i].dts == AV_NOPTS_VALUE) continue;
+        latest = packets[i].dts;
+        if (packets[i].pts != packets[i].dts) return latest;
+    }
+    return latest + duration;
+}
+
 }  // namespace
 
 std::vector<TimedPicture> presentedPictures(const std::vector<IndexedPacket>& packets,
@@ -102,7 +118,8 @@ std::vector<TimedPicture> presentedPictures(const std::vector<IndexedPacket>& pa
             if (i > 0 && std::llabs(decoded + shift - expected) > longestStep) shift = expected - decoded;
             expected = decoded + shift + duration;
         }
-        std::int64_t time = packet.pts != AV_NOPTS_VALUE ? packet.pts : packet.dts;
+        std::int64_t time = packet.pts;
+        if (time == AV_NOPTS_VALUE && packet.dts != AV_NOPTS_VALUE) time = presentation(packets, i, duration);
         time = time != AV_NOPTS_VALUE ? std::clamp(time, -most, most) + shift : due;
         due = time + duration;
         if (!(packet.flags & AV_PKT_FLAG_DISCARD)) pictures.push_back({time, i});
@@ -136,7 +153,7 @@ PicturePlan planPictures(const std::vector<TimedPicture>& pictures, Rational bas
     plan.shown.resize(static_cast<std::size_t>(plan.frames));
     std::size_t at = 0;
     for (std::size_t n = 0; n < plan.shown.size(); ++n) {
-        const double latest = static_cast<double>(n) * period + 0.5;
+        const double latest = static_cast<double>(n) * period + slack(period);
         while (at + 1 < pictures.size() && static_cast<double>(pictures[at + 1].time - first) <= latest) ++at;
         plan.shown[n] = static_cast<std::uint32_t>(at);
     }

@@ -19,8 +19,9 @@ struct TimedPicture {
     std::size_t packet;  // its number in the index
 };
 
-// The packets that are presented, sorted by their times; where a packet has none it follows the one before. A
-// step of the clock between two packets that is longer than `longestStep`, either way, is taken out.
+// The packets that are presented, sorted by their times. The time of one that has only a time of decoding
+// follows from the packets after it. A step of the clock between two packets that is longer than
+// `longestStep`, either way, is taken out.
 std::vector<TimedPicture> presentedPictures(const std::vector<IndexedPacket>& packets,
                                             std::int64_t usualDuration, std::int64_t longestStep);
 

@@ -115,6 +115,12 @@ bool isBare(const AVFormatContext& context) {
            !(context.iformat->flags & AVFMT_NO_BYTE_SEEK) && lower(context.iformat->name) != "ogg";
 }
 
+bool isEncrypted(const AVStream& stream) {
+    const unsigned tag = stream.codecpar->codec_tag;
+    return tag == MKTAG('e', 'n', 'c', 'v') || tag == MKTAG('e', 'n', 'c', 'a') ||
+           av_stream_get_side_data(&stream, AV_PKT_DATA_ENCRYPTION_INIT_INFO, nullptr);
+}
+
 std::string unfit(const AVFormatContext& context) {
     if (context.nb_streams == 0) return "it has no stream";
     bool media = false;
@@ -123,6 +129,7 @@ std::string unfit(const AVFormatContext& context) {
         if (codec.width > limits::side || codec.height > limits::side ||
             std::int64_t{codec.width} * codec.height > limits::pixels)
             return "its pictures are larger than " + std::to_string(limits::side) + " pixels";
+        if (isEncrypted(*context.streams[i])) return "it is encrypted";
         media = media || codec.codec_type == AVMEDIA_TYPE_VIDEO || codec.codec_type == AVMEDIA_TYPE_AUDIO ||
                 codec.codec_type == AVMEDIA_TYPE_SUBTITLE;
     }
