@@ -1,5 +1,6 @@
 #include "plugins/av/decoder/avdec.h"
 
+#include <algorithm>
 #include <cmath>
 #include <cstring>
 #include <new>
@@ -10,6 +11,7 @@
 #include "core/measure/qvgeometry.h"
 #include "core/stream/qvbytesource.h"
 #include "plugins/av/decoder/filmstreams.h"
+#include "plugins/av/index/packetindex.h"
 #include "plugins/av/source/avheaders.h"
 
 namespace av {
@@ -56,6 +58,33 @@ double announced(const AVStream& stream, const AVFormatContext& container) {
 long long announcedUnits(const AVStream& stream, const AVFormatContext& container, double rate) {
     const double units = announced(stream, container) * rate;
     return units > 0 && units < 1e15 ? std::llround(units) : 0;
+}
+
+// Containers of one table of samples say how many packets there are.
+bool lacksPackets(const AVStream& stream, const AVFormatContext& container, std::size_t packets) {
+    return std::strstr(container.iformat->name, "mp4") && stream.nb_frames > 0 &&
+           static_cast<std::uint64_t>(stream.nb_frames) > packets;
+}
+
+// Containers whose header states the length of the film, which ends earlier than that.
+bool endsEarly(const AVFormatContext& container, const PacketIndex& index) {
+    const char* const name = container.iformat->name;
+    if (!std::strstr(name, "matroska") && std::strcmp(name, "avi") != 0) return false;
+    if (container.duration == AV_NOPTS_VALUE) return false;
+    double first = 0, last = 0;
+    bool any = false;
+    for (unsigned i = 0; i < container.nb_streams; ++i)
+        for (const IndexedPacket& packet : index.packets(static_cast<int>(i))) {
+            const std::int64_t time = packet.pts != AV_NOPTS_VALUE ? packet.pts : packet.dts;
+            if (time == AV_NOPTS_VALUE) continue;
+            const double unit = av_q2d(container.streams[i]->time_base);
+            const double start = static_cast<double>(time) * unit;
+            first = any ? std::min(first, start) : start;
+            last = std::max(any ? last : start, start + packet.duration * unit);
+            any = true;
+        }
+    const double stated = static_cast<double>(container.duration) / AV_TIME_BASE;
+    return any && stated > (last - first) * 1.01 + 1;
 }
 
 }  // namespace
@@ -132,6 +161,12 @@ int AvDec::openFilm() {
 void AvDec::addStreams(MediaInput& input, std::string& reason) {
     const AVFormatContext& container = input.context();
     const bool damaged = !index_->damage().empty();
+    const bool early = endsEarly(container, *index_);
+    const auto isCut = [&](unsigned number) {
+        return damaged || early ||
+               lacksPackets(*container.streams[number], container,
+                            index_->packets(static_cast<int>(number)).size());
+    };
     FilmZero zero;
     const auto leaveOut = [&](unsigned number, const std::string& why) {
         qv_log()->warning("Stream %u of '%s' is left out: %s", number, filename().toString().asString(""),
@@ -152,9 +187,12 @@ void AvDec::addStreams(MediaInput& input, std::string& reason) {
             if (!zero.known && !covers) zero = {true, reader->zero(), reader->zeroBase()};
             auto* const added = addStream(std::make_unique<PictureStream>(std::move(reader), stream));
             const double rate = added->reader().format().rate.rate().ratio();
-            if (damaged && !covers) added->setTruncated(announcedUnits(stream, container, rate));
+            if (!covers && isCut(i)) added->setTruncated(announcedUnits(stream, container, rate));
         }
     };
+    if (damaged)
+        qv_log()->warning("'%s' is damaged: %s", filename().toString().asString(""),
+                          index_->damage().c_str());
     addPictures(false);
     for (unsigned i = 0; i < container.nb_streams; ++i) {
         const AVStream& stream = *container.streams[i];
@@ -167,7 +205,7 @@ void AvDec::addStreams(MediaInput& input, std::string& reason) {
             continue;
         }
         auto* const added = addStream(std::make_unique<SoundStream>(std::move(reader), stream));
-        if (damaged)
+        if (isCut(i))
             added->setTruncated(announcedUnits(stream, container, added->reader().format().samplerate));
     }
     if (streams().empty()) addPictures(true);

@@ -62,8 +62,9 @@ int PictureStream::read() {
 }
 
 void PictureStream::setTruncated(long long expected) {
+    if (expected <= reader_->format().frames) return;
     params.set("truncated", 1);
-    params.set("framesExpected", Any(std::max<long long>(expected, reader_->format().frames)));
+    params.set("framesExpected", Any(expected));
 }
 
 SoundStream::SoundStream(std::unique_ptr<SampleReader> reader, const AVStream& stream)
@@ -111,8 +112,9 @@ bool SoundStream::seek(long long sample) {
 }
 
 void SoundStream::setTruncated(long long expected) {
+    if (expected <= reader_->format().samples) return;
     params.set("truncated", 1);
-    params.set("samplesExpected", Any(std::max(expected, reader_->format().samples)));
+    params.set("samplesExpected", Any(expected));
 }
 
 }  // namespace av

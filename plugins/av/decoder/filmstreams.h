@@ -25,7 +25,7 @@ class PictureStream : public DPipeVideoStream {
         return frame >= 0 && frame <= reader_->format().frames && reader_->seek(static_cast<int>(frame));
     }
     PictureReader& reader() { return *reader_; }
-    // The file was cut, or is damaged: fewer frames than it announces.
+    // The file was cut, or is damaged. Nothing changes if it has what it announces all the same.
     void setTruncated(long long expected);
 
   private:

@@ -73,6 +73,46 @@ TEST_F(FilmsInTheTool, thatAreNoneAreRefusedInOneLine) {
     EXPECT_EQ(tarsel({"info", "missing.mp4"}).status, 3);
 }
 
+TEST_F(FilmsInTheTool, thatWereCutGiveWhatIsThere) {
+    for (const char* ext : {"mp4", "mkv", "avi"}) {
+        const std::string name = std::string("film.") + ext, cut = std::string("cut.") + ext;
+        const std::string file = film(name, {"-c:v", "mpeg4", "-g", "12", "-movflags", "+faststart"},
+                                      "testsrc2=size=96x64:rate=25:duration=8");
+        const std::string bytes = TempFolder::read(file);
+        folder.write(cut, bytes.substr(0, bytes.size() / 2));
+        const Outcome refused = tarsel({"transcode", cut, "-y", "-o", "out.i420"});
+        EXPECT_EQ(refused.status, 3) << cut << refused.err;
+        EXPECT_THAT(refused.err, HasSubstr("of 200 frames"));
+        const Outcome taken = tarsel({"transcode", "--accept-partial", cut, "-y", "-o", "out.i420"});
+        EXPECT_EQ(taken.status, 0) << taken.err;
+        // All but the last of them, of which a part may be there.
+        const std::string made = TempFolder::read(folder.file("out.i420"));
+        const std::size_t size = 96 * 64 * 3 / 2, whole = made.size() / size - 1;
+        EXPECT_GT(whole, 50u) << cut;
+        EXPECT_TRUE(made.substr(0, whole * size) == pictures(file, "yuv420p").substr(0, whole * size)) << cut;
+    }
+}
+
+TEST_F(FilmsInTheTool, bringTheirSound) {
+    const std::string file = folder.file("film.mkv");
+    ASSERT_EQ(ffmpeg({"-f", "lavfi", "-i", kMoving, "-f", "lavfi", "-i", "sine=frequency=440:duration=2",
+                      "-c:v", "mpeg4", "-c:a", "flac", file})
+                  .status,
+              0);
+    const Outcome o = tarsel({"transcode", "film.mkv", "-o", "film.wav"});
+    EXPECT_EQ(o.status, 0) << o.err;
+    const auto samples = [&](const std::string& name) {
+        const std::string raw = folder.file("samples.raw");
+        EXPECT_EQ(ffmpeg({"-i", name, "-f", "s16le", raw}).status, 0);
+        return TempFolder::read(raw);
+    };
+    EXPECT_EQ(samples(file).size(), 2u * 88200);
+    EXPECT_TRUE(samples(folder.file("film.wav")) == samples(file));
+    const Outcome part = tarsel({"transcode", "film.mkv", "--from", "20f", "--to", "30f", "-o", "part.wav"});
+    EXPECT_EQ(part.status, 0) << part.err;
+    EXPECT_TRUE(samples(folder.file("part.wav")) == samples(file).substr(2 * 20 * 1764, 2 * 10 * 1764));
+}
+
 TEST_F(FilmsInTheTool, keepTheirFieldsAndAspect) {
     film("fields.mpg",
          {"-c:v", "mpeg2video", "-flags", "+ildct+ilme", "-top", "1", "-vf", "setfield=tff,setdar=4/3"});
