@@ -49,6 +49,10 @@ bool isCover(const AVStream& stream) { return (stream.disposition & AV_DISPOSITI
 
 // Seconds that the container announces for a stream; 0 for unknown.
 double announced(const AVStream& stream, const AVFormatContext& container) {
+    // Of AVI the library has a length that fits to the size of the file.
+    const bool pictures = stream.codecpar->codec_type == AVMEDIA_TYPE_VIDEO;
+    if (std::strcmp(container.iformat->name, "avi") == 0 && pictures && stream.nb_frames > 0)
+        return static_cast<double>(stream.nb_frames) * av_q2d(stream.time_base);
     if (stream.duration != AV_NOPTS_VALUE)
         return static_cast<double>(stream.duration) * av_q2d(stream.time_base);
     if (container.duration != AV_NOPTS_VALUE) return static_cast<double>(container.duration) / AV_TIME_BASE;
@@ -83,7 +87,10 @@ bool endsEarly(const AVFormatContext& container, const PacketIndex& index) {
             last = std::max(any ? last : start, start + packet.duration * unit);
             any = true;
         }
-    const double stated = static_cast<double>(container.duration) / AV_TIME_BASE;
+    double stated = static_cast<double>(container.duration) / AV_TIME_BASE;
+    for (unsigned i = 0; i < container.nb_streams; ++i)
+        if (container.streams[i]->codecpar->codec_type == AVMEDIA_TYPE_VIDEO)
+            stated = std::max(stated, announced(*container.streams[i], container));
     return any && stated > (last - first) * 1.01 + 1;
 }
 

@@ -20,9 +20,10 @@ class Codecs {
     Codecs() = default;
     Codecs(const Codecs&) = delete;
     Codecs& operator=(const Codecs&) = delete;
+    // The library stays in memory: some of those under it keep blocks and threads of their own to the end of
+    // the program, and must not go earlier.
     ~Codecs() {
         if (leave_) leave_();
-        if (library_) qv_platform().unloadLibrary(library_);
     }
 
     // Null, with the reason in the log, if the library can't be used. It is tried again each time: what was
@@ -33,7 +34,6 @@ class Codecs {
     }
 
   private:
-    void* library_ = nullptr;
     av::CreateCodec create_ = nullptr;
     av::Leave leave_ = nullptr;
 
@@ -54,7 +54,6 @@ class Codecs {
         };
         create_ = reinterpret_cast<av::CreateCodec>(entry(av::createSymbol));
         leave_ = reinterpret_cast<av::Leave>(entry(av::leaveSymbol));
-        library_ = library.handle;
         if (!create_) qv_dbg()->error("%s is not of this version", name.c_str());
         return create_ != nullptr;
     }

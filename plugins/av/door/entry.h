@@ -11,7 +11,7 @@ inline constexpr const char* codecsFile = "av_codecs.so";
 using CreateCodec = QvCodec* (*)(const char* module);
 inline constexpr const char* createSymbol = "av_create_codec";
 
-// Before the library is unloaded: the libraries under it, which may stay, call nothing of it any more.
+// When the plug-in is unloaded: what the codec libraries report no longer goes to the engine.
 using Leave = void (*)();
 inline constexpr const char* leaveSymbol = "av_leave";
 

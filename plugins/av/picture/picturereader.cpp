@@ -4,8 +4,10 @@
 #include <optional>
 #include <utility>
 
+#include "core/measure/mediatime.h"
 #include "core/media/qvframe.h"
 #include "plugins/av/picture/decodedpictures.h"
+#include "plugins/av/picture/picturecaptions.h"
 #include "plugins/av/picture/pictureform.h"
 #include "plugins/av/picture/picturetimes.h"
 #include "plugins/av/picture/picturewords.h"
@@ -46,6 +48,7 @@ class PictureReader::Decoding {
     std::int64_t firstTime() const { return hasTimes() ? pictures_.front().time : 0; }
     // Whether the reader's frame has the picture already, which is shown again.
     bool isWritten() const { return written_ == heldNumber_; }
+    bool shows(std::size_t number) const { return heldNumber_ == number; }
     void setWritten() { written_ = heldNumber_; }
     void describe(PictureFormat& format);
 
@@ -349,7 +352,8 @@ PictureReader::Read PictureReader::read() {
     if (next_ >= format_.frames) return Read::end;
     const auto& shown = decoding_->plan().shown;
     const auto n = static_cast<std::size_t>(next_);
-    const Read result = decoding_->show(shown.empty() ? n : shown[n], failure_);
+    const std::size_t wanted = shown.empty() ? n : shown[n];
+    const Read result = decoding_->show(wanted, failure_);
     if (result != Read::picture) return result;
     const AVFrame& picture = decoding_->picture();
     if (!decoding_->isWritten()) {
@@ -362,6 +366,12 @@ PictureReader::Read PictureReader::read() {
     frame_->framerate = QvFramerate(format_.rate.rate(), fieldOrderOf(picture));
     frame_->setYUVMatrix(static_cast<QvYUVMatrix>(format_.colourMatrix));
     frame_->frameNr = next_++;
+    // A picture that stays says its captions once.
+    if (decoding_->shows(wanted) && (shown.empty() || n == 0 || shown[n - 1] != shown[n]))
+        carryCaptions(picture, MediaTime(frame_->frameNr, format_.rate, MediaTime::defaultTimescale),
+                      *frame_);
+    else if (frame_->subpic())
+        frame_->clearSubpic();
     return Read::picture;
 }
 
