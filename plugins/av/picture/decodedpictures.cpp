@@ -66,7 +66,8 @@ bool DecodedPictures::seek(std::size_t packet) {
     avcodec_flush_buffers(codec_.get());
     position_ = packet;
     if (atStart) return true;
-    const bool found = packet == 0 ? input_->rewind() : input_->seekTo(stream_, packets()[packet].which());
+    const bool found =
+        packet == 0 ? input_->rewind() : input_->seekTo(stream_, packets()[packet].which(), packet);
     if (!found) failure_ = input_->failure();
     return found;
 }

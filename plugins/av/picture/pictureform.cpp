@@ -132,7 +132,7 @@ PictureForm formOf(AVPixelFormat format, bool fullRange) {
         form.from = AV_PIX_FMT_YUYV422;
     if (form.fourcc == QvFourcc::W016 || form.fourcc == QvFourcc::Y216) form.shift = 16 - depthOf(form.from);
     const bool yuv = planes || pairs;
-    if (format == form.from) return form;
+    if (format == form.from && !(fullRange && yuv)) return form;
     form.lost = nameOf(format) + (fullRange && yuv ? " of full range" : "") + " is converted to " +
                 qvFourccText(form.fourcc).data() + (fullRange && yuv ? " at video levels" : "");
     if ((layout->flags & AV_PIX_FMT_FLAG_ALPHA) && yuv) form.lost += ", without its alpha";

@@ -128,7 +128,8 @@ bool SampleReader::Decoding::seek(std::size_t packet) {
     current_ = packet;
     within_ = 0;
     if (atStart) return true;
-    const bool found = packet == 0 ? input_->rewind() : input_->seekTo(stream_, packets()[packet].which());
+    const bool found =
+        packet == 0 ? input_->rewind() : input_->seekTo(stream_, packets()[packet].which(), packet);
     if (!found) failure_ = input_->failure();
     return found;
 }

@@ -97,8 +97,9 @@ bool same(const PacketKey& key, const AVPacket& packet, bool byPosition) {
     const bool placed = key.position >= 0 && packet.pos >= 0;
     if (placed && key.position != packet.pos) return false;
     if (placed && byPosition) return true;
-    if (key.pts != AV_NOPTS_VALUE && packet.pts != AV_NOPTS_VALUE) return key.pts == packet.pts;
-    if (key.dts != AV_NOPTS_VALUE && packet.dts != AV_NOPTS_VALUE) return key.dts == packet.dts;
+    // Several packets may have one place. A time that the index has and the packet lacks says nothing.
+    if (key.pts != AV_NOPTS_VALUE) return key.pts == packet.pts;
+    if (key.dts != AV_NOPTS_VALUE) return packet.pts == AV_NOPTS_VALUE && key.dts == packet.dts;
     return placed;
 }
 
@@ -119,6 +120,12 @@ bool isEncrypted(const AVStream& stream) {
     const unsigned tag = stream.codecpar->codec_tag;
     return tag == MKTAG('e', 'n', 'c', 'v') || tag == MKTAG('e', 'n', 'c', 'a') ||
            av_stream_get_side_data(&stream, AV_PKT_DATA_ENCRYPTION_INIT_INFO, nullptr);
+}
+
+// Program and transport streams.
+bool isCutByParser(const AVFormatContext& context) {
+    const std::string name = context.iformat->name;
+    return name == "mpeg" || name == "mpegts";
 }
 
 std::string unfit(const AVFormatContext& context) {
@@ -264,13 +271,17 @@ bool MediaInput::rewind() {
 }
 
 // Reads up to that packet. False if it is not among what follows.
-bool MediaInput::find(int stream, const PacketKey& key, bool toTheEnd) {
+bool MediaInput::find(int stream, const PacketKey& key) {
     const bool bare = isBare(context());
+    // Where pictures are cut out of a stream of bytes, the first one after a seek may be the end of another
+    // with the time of this one.
+    bool whole = !isCutByParser(context());
     AVPacket& packet = *state_->found;
     while (read(packet) == Read::packet) {
         if (packet.stream_index == stream) {
-            if (same(key, packet, bare)) return state_->hasFound = true;
-            if (!toTheEnd && after(key, packet)) break;
+            if (whole && same(key, packet, bare)) return state_->hasFound = true;
+            if (after(key, packet)) break;
+            whole = true;
         }
         av_packet_unref(&packet);
     }
@@ -278,7 +289,18 @@ bool MediaInput::find(int stream, const PacketKey& key, bool toTheEnd) {
     return false;
 }
 
-bool MediaInput::seekTo(int stream, const PacketKey& key) {
+// The same from the start, by counting.
+bool MediaInput::count(int stream, std::size_t number) {
+    if (!rewind()) return false;
+    AVPacket& packet = *state_->found;
+    while (read(packet) == Read::packet) {
+        if (packet.stream_index == stream && number-- == 0) return state_->hasFound = true;
+        av_packet_unref(&packet);
+    }
+    return false;
+}
+
+bool MediaInput::seekTo(int stream, const PacketKey& key, std::size_t number) {
     AVFormatContext& all = context();
     state_->hasFound = false;
     av_packet_unref(state_->found.get());
@@ -287,15 +309,14 @@ bool MediaInput::seekTo(int stream, const PacketKey& key) {
     const std::int64_t time = key.dts != AV_NOPTS_VALUE ? key.dts : key.pts;
     if (isBare(all)) {
         if (key.position >= 0 && av_seek_frame(&all, -1, key.position, AVSEEK_FLAG_BYTE) >= 0 &&
-            find(stream, key, false))
+            find(stream, key))
             return true;
     } else if (time != AV_NOPTS_VALUE) {
         for (const std::int64_t back : {std::int64_t{0}, second, 10 * second})
-            if (av_seek_frame(&all, stream, time - back, AVSEEK_FLAG_BACKWARD) >= 0 &&
-                find(stream, key, false))
+            if (av_seek_frame(&all, stream, time - back, AVSEEK_FLAG_BACKWARD) >= 0 && find(stream, key))
                 return true;
     }
-    if (rewind() && find(stream, key, true)) return true;
+    if (count(stream, number)) return true;
     if (failure_.empty()) failure_ = "a packet that was there before was not found again";
     return false;
 }

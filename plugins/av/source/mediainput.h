@@ -5,6 +5,7 @@
 // names other files opens none of them.
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 #include <memory>
 #include <string>
@@ -67,7 +68,8 @@ class MediaInput {
     // it, the file is read from an earlier place until it comes. False with failure(): it did not come.
     // What follows comes in the order of the index; times of packets may differ from those of the index, as
     // some containers derive them from where reading began.
-    bool seekTo(int stream, const PacketKey& packet);
+    // `number` is that of the packet among those of its stream.
+    bool seekTo(int stream, const PacketKey& packet, std::size_t number);
     bool rewind();
 
   private:
@@ -77,7 +79,8 @@ class MediaInput {
     std::string failure_;
 
     MediaInput();
-    bool find(int stream, const PacketKey& packet, bool toTheEnd);
+    bool find(int stream, const PacketKey& packet);
+    bool count(int stream, std::size_t number);
 };
 
 }  // namespace av

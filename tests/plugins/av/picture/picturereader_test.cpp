@@ -132,8 +132,7 @@ TEST_F(PictureReaderOfFilms, aVariableRateBecomesAUsualOne) {
 }
 
 TEST_F(PictureReaderOfFilms, aHoleInTheFileIsCountedAndTheRestIsExact) {
-    const std::string file =
-        film("hole.mkv", {"-c:v", "mpeg2video", "-g", "1", "-q:v", "2"});
+    const std::string file = film("hole.mkv", {"-c:v", "mpeg2video", "-g", "1", "-q:v", "2"});
     const auto whole = open(file);
     ASSERT_TRUE(whole);
     std::string bytes = TempFolder::read(file);
