@@ -49,11 +49,15 @@ const Sample* row(const AVFrame& from, int plane, int y) {
     return reinterpret_cast<const Sample*>(from.data[plane] + std::ptrdiff_t{y} * from.linesize[plane]);
 }
 
+// Rows of a frame of odd width begin at any byte.
 void shiftRows(const AVFrame& from, int plane, QvFrame& to, int width, int rows, int shift) {
     for (int y = 0; y < rows; ++y) {
         const Word* const in = row<Word>(from, plane, y);
-        auto* const out = reinterpret_cast<Word*>(to.plane(plane) + std::ptrdiff_t{y} * to.stride(plane));
-        for (int x = 0; x < width; ++x) out[x] = static_cast<Word>(in[x] << shift);
+        unsigned char* const out = to.plane(plane) + std::ptrdiff_t{y} * to.stride(plane);
+        for (int x = 0; x < width; ++x) {
+            const auto value = static_cast<Word>(in[x] << shift);
+            std::memcpy(out + 2 * std::ptrdiff_t{x}, &value, sizeof value);
+        }
     }
 }
 
