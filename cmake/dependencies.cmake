@@ -36,3 +36,11 @@ pkg_check_modules(SOXR QUIET IMPORTED_TARGET soxr)
 if(NOT SOXR_FOUND)
   message(STATUS "libsoxr was not found: no sample rates of high quality. On Debian: apt-get install libsoxr-dev")
 endif()
+# Without them there is no codec plug-in.
+if(QV_BUILD_AV)
+  pkg_check_modules(AVLIBS QUIET IMPORTED_TARGET libavformat>=59 libavcodec>=59 libavutil>=57 libswscale>=6)
+  if(NOT AVLIBS_FOUND)
+    message(STATUS "libav was not found: no codec plug-in. On Debian: apt-get install "
+                   "libavformat-dev libavcodec-dev libavutil-dev libswscale-dev")
+  endif()
+endif()

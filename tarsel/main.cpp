@@ -27,15 +27,18 @@ namespace {
 // The engine, from the first command to the end of the program.
 class Engine {
   public:
-    Engine(const std::string& log, const std::string& plugins, bool allowUnsafe) : log_(log) {
+    // `plugins`: a folder of the user's, "" for none, after the one that belongs to the library.
+    Engine(const std::string& log, const std::string& plugins, bool ownPlugins, bool allowUnsafe)
+        : log_(log) {
         AnyDict config;
         if (!log.empty() && log != "stderr") requireLog(log);
         if (!log.empty()) config.set("logfile", log.c_str());
         if (allowUnsafe) config.set("allow_unsafe_plugins", 1);
         init_wrapper(&config);
         qv_registry()->addPlugin(qvSubtitlePlugin());
-        pluginsLoaded_ = !plugins.empty();
-        if (pluginsLoaded_) loadPlugins(plugins);
+        if (ownPlugins) pluginsLoaded_ = loadOwnPlugins();
+        if (!plugins.empty()) loadPlugins(plugins);
+        pluginsLoaded_ = pluginsLoaded_ || !plugins.empty();
         qvPresetMgr()->update();
     }
     ~Engine() {
@@ -88,9 +91,10 @@ int run(int argc, char** argv) {
     const std::string version = std::string("tarsel ") + QvUtil::libraryVersion().asString();
     CommandLine line("Transcodes, inspects and draws media from the command line.", version);
     std::string log, plugins;
-    bool allowUnsafePlugins = false;
+    bool noPlugins = false, allowUnsafePlugins = false;
     line.option("--log", log, "Write the engine's log to FILE, or to stderr", "FILE", nullptr);
     line.option("--plugins", plugins, "Load the plug-ins of FOLDER", "FOLDER", "TARSEL_PLUGINS");
+    line.flag("--no-plugins", noPlugins, "Leave out the plug-ins that came with the library");
     line.flag("--allow-unsafe-plugins", allowUnsafePlugins, "Load plug-ins that other users may change, too");
     addTranscode(line, signals, version);
     addRun(line, signals, version);
@@ -116,7 +120,7 @@ int run(int argc, char** argv) {
     if (parsed.prepare) parsed.prepare();
     if (log == "stderr" && Events::get().descriptor() == 2)
         throw failure(Msg::optionsExclude, {"--log stderr", "--progress json"});
-    Engine engine(log, plugins, allowUnsafePlugins);
+    Engine engine(log, plugins, !noPlugins, allowUnsafePlugins);
     parsed.action();
     flushOutput();
     return status(Exit::done);

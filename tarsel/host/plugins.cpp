@@ -111,17 +111,40 @@ void tell(const std::string& folder, const std::vector<QvPluginFailure>& failure
     }
 }
 
+// Once for the whole program.
+void watchEnds() {
+    static const bool watched = [] {
+        std::atexit([] { blameLoadingPlugin("it called exit()"); });
+        std::at_quick_exit([] { blameLoadingPlugin("it called quick_exit()"); });
+        return true;
+    }();
+    static_cast<void>(watched);
+}
+
 }  // namespace
 
-void loadPlugins(const std::string& folder) {
-    std::atexit([] { blameLoadingPlugin("it called exit()"); });
-    std::at_quick_exit([] { blameLoadingPlugin("it called quick_exit()"); });
+bool loadOwnPlugins() {
+    const Any library = QvUtil::libraryPath().toString();
+    std::string folder = library.asString("");
+    folder = folder.substr(0, folder.rfind('/') + 1) + "qvplugcore/plugins";
+    if (!whyNoFolder(folder).empty()) return false;
+    watchEnds();
     const CrashWatch watch;
+    const bool any = qv_registry()->scanFolder(Any(folder.c_str())) == QvStatus::ok;
+    tell(folder, qv_registry()->pluginFailures());
+    return any;
+}
+
+void loadPlugins(const std::string& folder) {
+    watchEnds();
+    const CrashWatch watch;
+    const auto told = static_cast<std::ptrdiff_t>(qv_registry()->pluginFailures().size());
     if (const std::string why = whyNoFolder(folder); !why.empty())
         warn(lineOf(Msg::pluginsNoFolder, {folder, why}));
     else if (qv_registry()->scanFolder(Any(folder.c_str())) != QvStatus::ok)
         warn(lineOf(Msg::pluginsAbsent, {folder}));
-    tell(folder, qv_registry()->pluginFailures());
+    const std::vector<QvPluginFailure>& all = qv_registry()->pluginFailures();
+    tell(folder, {all.begin() + std::min(told, std::ssize(all)), all.end()});
 }
 
 int pluginWarnings() { return g_warnings; }

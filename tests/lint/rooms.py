@@ -39,6 +39,9 @@ def include_faults(tree, file, rooms):
         other = os.path.normpath(os.path.dirname(found[1]))
         if other not in rooms:
             faults.append(f"{file}: includes {found[1]}, which is in no room")
+        elif own.startswith("plugins/") and other.startswith("core/"):
+            if found[1].endswith("_p.h") or other.endswith("/posix"):
+                faults.append(f"{file}: includes {found[1]}, which is not installed")
         elif own.split("/")[0] in ("tarsel", "plugins") and other.split("/")[0] != own.split("/")[0]:
             faults.append(f"{file}: includes {found[1]}; here use installed headers, <qvplugcore/...>")
         elif other != own and rooms[other][0] >= rooms[own][0]:

@@ -27,7 +27,7 @@ tool with `--filter NAME:parameter=value`. The types are those of `Any`; a flag 
 
 
 def told(tarsel, command):
-    return json.loads(subprocess.run([tarsel, command, "--json"], check=True, capture_output=True).stdout)
+    return json.loads(subprocess.run([tarsel, "--no-plugins", command, "--json"], check=True, capture_output=True).stdout)
 
 
 def cell(text):

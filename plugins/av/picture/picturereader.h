@@ -56,18 +56,19 @@ class PictureReader {
     Read read();
     QvFrame& frame() { return *frame_; }
     const std::string& failure() const { return failure_; }
-    int concealed() const { return concealed_; }  // pictures that the codec reported as damaged
+    int concealed() const;  // pictures so far that the codec reported as damaged, or did not deliver
 
   private:
-    struct Decoding;
+    class Decoding;
     std::unique_ptr<Decoding> decoding_;
     PictureFormat format_;
     std::int64_t zero_ = 0, zeroBase_ = 1;
     std::unique_ptr<QvFrame> frame_;
     std::string failure_;
-    int concealed_ = 0;
+    int next_ = 0;  // picture
 
     PictureReader();
+    bool describe();
 };
 
 }  // namespace av

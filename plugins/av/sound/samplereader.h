@@ -9,6 +9,7 @@
 #include <cstdint>
 #include <memory>
 #include <string>
+#include <vector>
 
 #include "plugins/av/index/packetindex.h"
 
@@ -50,13 +51,19 @@ class SampleReader {
     }  // packets that could not be decoded and became silence
 
   private:
-    struct Decoding;
+    class Decoding;
     std::unique_ptr<Decoding> decoding_;
     SoundFormat format_;
     std::string failure_;
     long long concealed_ = 0;
+    long long next_ = 0;  // sample
+    bool moved_ = true;   // decoding does not continue where it was
+    bool ended_ = false;
+    long long blockAt_ = 0;  // place of what is decoded, and not all delivered
+    std::vector<unsigned char> block_;
 
     SampleReader();
+    bool fetch();
 };
 
 }  // namespace av

@@ -5,6 +5,7 @@
 // names other files opens none of them.
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 #include <memory>
 #include <string>
@@ -51,8 +52,8 @@ class MediaInput {
     MediaInput(const MediaInput&) = delete;
     MediaInput& operator=(const MediaInput&) = delete;
 
-    AVFormatContext& context() { return *context_; }
-    const AVFormatContext& context() const { return *context_; }
+    AVFormatContext& context();
+    const AVFormatContext& context() const;
 
     // From here on only packets of this stream are delivered; others are skipped where the container can, and
     // are never decoded. -1: of all streams.
@@ -65,17 +66,21 @@ class MediaInput {
 
     // The next packet that read() delivers of this stream is this one. Where the container's own seek misses
     // it, the file is read from an earlier place until it comes. False with failure(): it did not come.
-    bool seekTo(int stream, const PacketKey& packet);
+    // What follows comes in the order of the index; times of packets may differ from those of the index, as
+    // some containers derive them from where reading began.
+    // `number` is that of the packet among those of its stream.
+    bool seekTo(int stream, const PacketKey& packet, std::size_t number);
     bool rewind();
 
   private:
-    struct Bytes;
-    std::unique_ptr<Bytes> bytes_;
-    AVFormatContext* context_ = nullptr;
+    struct State;
+    std::unique_ptr<State> state_;
     int only_ = -1;
     std::string failure_;
 
-    MediaInput() = default;
+    MediaInput();
+    bool find(int stream, const PacketKey& packet);
+    bool count(int stream, std::size_t number);
 };
 
 }  // namespace av

@@ -1,0 +1,14 @@
+// The entries of "av_codecs.so".
+#include <cstring>
+
+#include "core/arch/api.h"
+#include "plugins/av/decoder/avdec.h"
+#include "plugins/av/source/librarylog.h"
+
+extern "C" QV_API QvCodec* av_create_codec(const char* module) {
+    av::sendLibraryLog();
+    if (std::strcmp(module, "avdec") == 0) return new av::AvDec;
+    return nullptr;
+}
+
+extern "C" QV_API void av_leave() { av::resetLibraryLog(); }

@@ -1,0 +1,271 @@
+#include "plugins/av/decoder/avdec.h"
+
+#include <algorithm>
+#include <cmath>
+#include <cstring>
+#include <new>
+
+#include "core/engine/log/qvlog.h"
+#include "core/engine/modules/params.h"
+#include "core/engine/status.h"
+#include "core/measure/qvgeometry.h"
+#include "core/stream/qvbytesource.h"
+#include "plugins/av/decoder/filmstreams.h"
+#include "plugins/av/index/packetindex.h"
+#include "plugins/av/source/avheaders.h"
+
+namespace av {
+
+namespace {
+
+using Settings = AvDec::Settings;
+
+int setSource(Settings& settings, const Any& value) {
+    settings.source = qvSourceOf(value);
+    return value.isValid() && !settings.source ? QvStatus::invalidParam : QvStatus::ok;
+}
+
+constexpr QvParamRow<Settings> rows[] = {
+    {.name = qvSourceParam,
+     .member = QvParamAccess<Settings>{setSource, nullptr},
+     .flags = qvParamWriteOnly,
+     .help = "a byte source in the place of the file",
+     .type = Any::Generic},
+    {.name = "threads",
+     .member = &Settings::threads,
+     .flags = qvParamStored,
+     .min = 0,
+     .max = 64,
+     .help = "threads of each stream's codec; 0: one a core"},
+    {.name = "container",
+     .member = &Settings::container,
+     .flags = qvParamStored,
+     .help = "the format of the file by the name that the libraries have for it; empty: found out"},
+};
+static_assert(qvParamTableOk<Settings>(rows));
+
+// A picture of the cover or of a title, which is no film, unless there is nothing else.
+bool isCover(const AVStream& stream) { return (stream.disposition & AV_DISPOSITION_ATTACHED_PIC) != 0; }
+
+// Seconds that the container announces for a stream; 0 for unknown.
+double announced(const AVStream& stream, const AVFormatContext& container) {
+    // Of AVI the library has a length that fits to the size of the file.
+    const bool pictures = stream.codecpar->codec_type == AVMEDIA_TYPE_VIDEO;
+    if (std::strcmp(container.iformat->name, "avi") == 0 && pictures && stream.nb_frames > 0)
+        return static_cast<double>(stream.nb_frames) * av_q2d(stream.time_base);
+    if (stream.duration != AV_NOPTS_VALUE)
+        return static_cast<double>(stream.duration) * av_q2d(stream.time_base);
+    if (container.duration != AV_NOPTS_VALUE) return static_cast<double>(container.duration) / AV_TIME_BASE;
+    return 0;
+}
+
+long long announcedUnits(const AVStream& stream, const AVFormatContext& container, double rate) {
+    const double units = announced(stream, container) * rate;
+    return units > 0 && units < 1e15 ? std::llround(units) : 0;
+}
+
+// Containers of one table of samples say how many packets there are.
+bool lacksPackets(const AVStream& stream, const AVFormatContext& container, std::size_t packets) {
+    return std::strstr(container.iformat->name, "mp4") && stream.nb_frames > 0 &&
+           static_cast<std::uint64_t>(stream.nb_frames) > packets;
+}
+
+// Containers whose header states the length of the film, which ends earlier than that.
+bool endsEarly(const AVFormatContext& container, const PacketIndex& index) {
+    const char* const name = container.iformat->name;
+    if (!std::strstr(name, "matroska") && std::strcmp(name, "avi") != 0) return false;
+    if (container.duration == AV_NOPTS_VALUE) return false;
+    double first = 0, last = 0;
+    bool any = false;
+    for (unsigned i = 0; i < container.nb_streams; ++i)
+        for (const IndexedPacket& packet : index.packets(static_cast<int>(i))) {
+            const std::int64_t time = packet.pts != AV_NOPTS_VALUE ? packet.pts : packet.dts;
+            if (time == AV_NOPTS_VALUE) continue;
+            const double unit = av_q2d(container.streams[i]->time_base);
+            const double start = static_cast<double>(time) * unit;
+            first = any ? std::min(first, start) : start;
+            last = std::max(any ? last : start, start + packet.duration * unit);
+            any = true;
+        }
+    double stated = static_cast<double>(container.duration) / AV_TIME_BASE;
+    for (unsigned i = 0; i < container.nb_streams; ++i)
+        if (container.streams[i]->codecpar->codec_type == AVMEDIA_TYPE_VIDEO)
+            stated = std::max(stated, announced(*container.streams[i], container));
+    return any && stated > (last - first) * 1.01 + 1;
+}
+
+}  // namespace
+
+// Where the film begins, in seconds: sound goes by it.
+struct FilmZero {
+    bool known = false;
+    std::int64_t time = 0, base = 1;
+};
+
+AvDec::~AvDec() { AvDec::close(); }
+
+// Parameters in a dictionary, as an application opens or restores with. The first failure counts.
+int AvDec::setAll(const Any& value) {
+    if (!value.isDict()) return QvStatus::invalidParam;
+    int result = QvStatus::ok;
+    for (const auto [key, entry] : value.asDict())
+        if (const int status = setParam(key, *entry); result == QvStatus::ok) result = status;
+    return result;
+}
+
+int AvDec::setParam(const char* name, const Any& value) {
+    if (std::strcmp(name, "openParameters") == 0 || std::strcmp(name, "settings") == 0) return setAll(value);
+    if (auto result = _setRow<Settings>(rows, settings_, name, value)) return *result;
+    return BaseDecodePipe::setParam(name, value);
+}
+
+void AvDec::getParam(const char* name, Any& value) const {
+    if (std::strcmp(name, "filesize") == 0) {
+        value = fileSize_;
+    } else if (std::strcmp(name, "store") == 0) {
+        AnyDict settings;
+        qvStoreParamRows<Settings>(rows, settings_, settings);
+        value = AnyDict("settings", settings);
+    } else if (!qvGetParamRow<Settings>(rows, settings_, name, value)) {
+        BaseDecodePipe::getParam(name, value);
+    }
+}
+
+int AvDec::refuse(const std::string& reason) {
+    dropStreams();
+    index_.reset();
+    bytes_.reset();
+    const Any name = filename().toString();
+    return setError(QvStatus::cannotParse, "Can not read %s: %s", name.asString(""), reason.c_str());
+}
+
+int AvDec::open() {
+    if (getState() == stateOpen) close();
+    bytes_ = settings_.source ? std::make_unique<MediaBytes>(*settings_.source, filename())
+                              : std::make_unique<MediaBytes>(filename());
+    return openFilm();
+}
+
+int AvDec::openFilm() {
+    std::string reason;
+    {
+        const auto probe = bytes_->open(reason);
+        if (!probe) return refuse(reason);
+        fileSize_ = probe->size();
+        if (!probe->seekable()) return refuse("it has to be sought, and a pipe can't be; put it into a file");
+    }
+    const auto input = MediaInput::open(*bytes_, settings_.container, reason);
+    if (!input) return refuse(reason);
+    index_ = PacketIndex::build(*input, reason);
+    if (!index_) return refuse(reason);
+    addStreams(*input, reason);
+    if (streams().empty()) return refuse(reason.empty() ? "it has neither pictures nor sound" : reason);
+    return BaseDecodePipe::open();
+}
+
+// Pictures first: sound goes by the time of the first one. A stream that can't be decoded is left out, with a
+// line in the log; `reason` is the first of these.
+void AvDec::addStreams(MediaInput& input, std::string& reason) {
+    const AVFormatContext& container = input.context();
+    const bool damaged = !index_->damage().empty();
+    const bool early = endsEarly(container, *index_);
+    const auto isCut = [&](unsigned number) {
+        return damaged || early ||
+               lacksPackets(*container.streams[number], container,
+                            index_->packets(static_cast<int>(number)).size());
+    };
+    FilmZero zero;
+    const auto leaveOut = [&](unsigned number, const std::string& why) {
+        qv_log()->warning("Stream %u of '%s' is left out: %s", number, filename().toString().asString(""),
+                          why.c_str());
+        if (reason.empty()) reason = why;
+    };
+    const auto addPictures = [&](bool covers) {
+        for (unsigned i = 0; i < container.nb_streams; ++i) {
+            const AVStream& stream = *container.streams[i];
+            if (stream.codecpar->codec_type != AVMEDIA_TYPE_VIDEO || isCover(stream) != covers) continue;
+            std::string why;
+            auto reader = PictureReader::open(*bytes_, settings_.container, static_cast<int>(i), index_,
+                                              settings_.threads, why);
+            if (!reader) {
+                leaveOut(i, why);
+                continue;
+            }
+            if (!zero.known && !covers) zero = {true, reader->zero(), reader->zeroBase()};
+            auto* const added = addStream(std::make_unique<PictureStream>(std::move(reader), stream));
+            const double rate = added->reader().format().rate.rate().ratio();
+            if (!covers && isCut(i)) added->setTruncated(announcedUnits(stream, container, rate));
+        }
+    };
+    if (damaged)
+        qv_log()->warning("'%s' is damaged: %s", filename().toString().asString(""),
+                          index_->damage().c_str());
+    addPictures(false);
+    for (unsigned i = 0; i < container.nb_streams; ++i) {
+        const AVStream& stream = *container.streams[i];
+        if (stream.codecpar->codec_type != AVMEDIA_TYPE_AUDIO) continue;
+        std::string why;
+        auto reader = SampleReader::open(*bytes_, settings_.container, static_cast<int>(i), index_,
+                                         zero.known, zero.time, zero.base, why);
+        if (!reader) {
+            leaveOut(i, why);
+            continue;
+        }
+        auto* const added = addStream(std::make_unique<SoundStream>(std::move(reader), stream));
+        if (isCut(i))
+            added->setTruncated(announcedUnits(stream, container, added->reader().format().samplerate));
+    }
+    if (streams().empty()) addPictures(true);
+}
+
+int AvDec::close() {
+    const int result = BaseDecodePipe::close();
+    index_.reset();
+    bytes_.reset();
+    return result;
+}
+
+int AvDec::seekToFrame(long long frame, int stream) {
+    checkStream(qvVideoStream, stream, "seekToFrame");
+    auto& pictures = static_cast<PictureStream&>(*findStream(qvVideoStream, stream));
+    return pictures.seek(frame) ? QvStatus::ok : setError(QvStatus::endOfStream, "Seek failed");
+}
+
+int AvDec::seekToSample(long long sample, int stream) {
+    checkStream(qvAudioStream, stream, "seekToSample");
+    auto& sound = static_cast<SoundStream&>(*findStream(qvAudioStream, stream));
+    return sound.seek(sample) ? QvStatus::ok : setError(QvStatus::endOfStream, "Seek failed");
+}
+
+int AvDec::readFrame(int stream) {
+    checkStream(qvVideoStream, stream, "readFrame");
+    auto& pictures = static_cast<PictureStream&>(*findStream(qvVideoStream, stream));
+    const int result = pictures.read();
+    if (result == QvStatus::cannotParse)
+        return setError(result, "read frame failed: %s", pictures.reader().failure().c_str());
+    return result;
+}
+
+int AvDec::readSamples(int count, int stream) {
+    checkStream(qvAudioStream, stream, "readSamples");
+    auto& sound = static_cast<SoundStream&>(*findStream(qvAudioStream, stream));
+    const int result = sound.read(count);
+    if (result == QvStatus::outOfMemory) return setError(result, "Out of memory");
+    if (result == QvStatus::cannotParse)
+        return setError(result, "read samples failed: %s", sound.reader().failure().c_str());
+    return result;
+}
+
+QvFrame* AvDec::getFramePtr(int stream) {
+    checkStream(qvVideoStream, stream, "getFramePtr");
+    return &static_cast<PictureStream&>(*findStream(qvVideoStream, stream)).reader().frame();
+}
+
+QvPcm* AvDec::getAudioPtr(int stream) {
+    checkStream(qvAudioStream, stream, "getAudioPtr");
+    return findStream(qvAudioStream, stream)
+               ? static_cast<SoundStream&>(*findStream(qvAudioStream, stream)).pcm.get()
+               : nullptr;
+}
+
+}  // namespace av

@@ -1,0 +1,74 @@
+// Decoder "avdec": films, their pictures and sounds, of the containers and codecs that the libraries have.
+//
+// Frames and samples are counted before the first is read, from an index of the file's packets. Frame n and
+// sample n are the same after any seek as when the stream is read from its start. Streams are read and sought
+// independently: each has a demultiplexer of its own.
+//
+// Parameters: "source" (in the place of the file, see QvByteSource; it has to be sought), "threads" (stored;
+// of each stream's codec, 0: one a core), "container" (stored; the libraries' name of the format, "": found
+// out), "openParameters" and "settings" (a Dict of these).
+//
+// A stream of pictures has, besides what the contract asks for:
+//
+//     "rotation"          Int32     degrees clockwise to be shown upright: 90, 180 or 270; absent for 0
+//     "mirrored"          Int32     1: it is to be shown mirrored
+//     "colourMatrix"      Int32     QvYUVMatrix, where the film states one of these
+//     "variableRate"      Int32     1: "framerate" is the nearest usual rate, and frames repeat or skip
+//     pictures "conversion"        String    what the pixel format can't hold, or how the frames are made of
+//     the pictures "language", "title" String    where the container has them "concealed"         Int64
+//     pictures so far that were damaged or did not come "codecParams"       Dict      "pid", where the
+//     container numbers its streams
+//
+// A stream of sound has "language", "title", "channelMask" (Int64), "concealed" (packets) and "codecParams".
+// A file that is cut or damaged delivers what is there, see "truncated" in the contract.
+#pragma once
+
+#include <memory>
+#include <string>
+
+#include "core/decode/basedecodepipe.h"
+#include "plugins/av/source/mediainput.h"
+
+class QvByteSource;
+
+namespace av {
+
+class PacketIndex;
+struct FilmZero;
+
+class AvDec : public BaseDecodePipe {
+  public:
+    using BaseDecodePipe::BaseDecodePipe;
+    ~AvDec() override;
+
+    struct Settings {
+        QvByteSource* source = nullptr;  // borrowed; null: the file
+        int threads = 0;
+        std::string container;
+    };
+
+    using BaseDecodePipe::getParam;
+    int setParam(const char* name, const Any& value) override;
+    void getParam(const char* name, Any& value) const override;
+    int open() override;
+    int close() override;
+    int seekToFrame(long long frame, int stream) override;
+    int seekToSample(long long sample, int stream) override;
+    int readFrame(int stream) override;
+    int readSamples(int count, int stream) override;
+    QvFrame* getFramePtr(int stream) override;
+    QvPcm* getAudioPtr(int stream) override;
+
+  private:
+    Settings settings_;
+    std::unique_ptr<MediaBytes> bytes_;
+    std::shared_ptr<const PacketIndex> index_;
+    long long fileSize_ = -1;
+
+    int setAll(const Any& value);
+    int refuse(const std::string& reason);
+    void addStreams(MediaInput& input, std::string& reason);
+    int openFilm();
+};
+
+}  // namespace av

@@ -1,0 +1,120 @@
+#include "plugins/av/decoder/filmstreams.h"
+
+#include <algorithm>
+#include <climits>
+
+#include "core/engine/status.h"
+#include "core/media/qvframe.h"
+#include "plugins/av/source/avheaders.h"
+
+namespace av {
+
+namespace {
+
+void setText(const AVDictionary* tags, const char* tag, const char* key, AnyDict& params) {
+    const AVDictionaryEntry* const entry = av_dict_get(tags, tag, nullptr, 0);
+    if (entry && entry->value && *entry->value) params.set(key, Any(entry->value));
+}
+
+}  // namespace
+
+void describeStream(const AVStream& stream, AnyDict& params) {
+    setText(stream.metadata, "language", "language", params);
+    setText(stream.metadata, "title", "title", params);
+    if (stream.id > 0) params.set("codecParams", AnyDict("pid", stream.id));
+}
+
+PictureStream::PictureStream(std::unique_ptr<PictureReader> reader, const AVStream& stream)
+    : reader_(std::move(reader)) {
+    const PictureFormat& format = reader_->format();
+    params.set("FOURCC", format.fourcc);
+    params.set("width", format.width);
+    params.set("height", format.height);
+    params.set("framerate", Any(format.rate));
+    params.set("pixelAspect", format.pixelAspect);
+    params.set("frameAspect", format.pixelAspect * format.width / format.height);
+    params.set("frames", format.frames);
+    params.set("duration", format.frames / format.rate.rate().ratio());
+    params.set("codec", Any(format.codec.c_str()));
+    params.set("videoCodec", Any(format.codec.c_str()));
+    params.set("pal", format.rate.isPAL() ? 1 : 0);
+    params.set("nrViews", 1);
+    if (format.bitrate > 0) params.set("vBitrate", format.bitrate);
+    if (format.rotation != 0) params.set("rotation", format.rotation);
+    if (format.mirrored) params.set("mirrored", 1);
+    if (format.colourMatrix != 0) params.set("colourMatrix", format.colourMatrix);
+    if (format.variable) params.set("variableRate", 1);
+    if (!format.lost.empty()) params.set("conversion", Any(format.lost.c_str()));
+    describeStream(stream, params);
+}
+
+int PictureStream::read() {
+    switch (reader_->read()) {
+        case PictureReader::Read::end: return QvStatus::endOfStream;
+        case PictureReader::Read::failed: return QvStatus::cannotParse;
+        case PictureReader::Read::picture: break;
+    }
+    if (reader_->concealed() != concealed_) {
+        concealed_ = reader_->concealed();
+        params.set("concealed", Any(static_cast<long long>(concealed_)));
+    }
+    return QvStatus::ok;
+}
+
+void PictureStream::setTruncated(long long expected) {
+    if (expected <= reader_->format().frames) return;
+    params.set("truncated", 1);
+    params.set("framesExpected", Any(expected));
+}
+
+SoundStream::SoundStream(std::unique_ptr<SampleReader> reader, const AVStream& stream)
+    : reader_(std::move(reader)) {
+    const SoundFormat& format = reader_->format();
+    const int bytes = format.bits / 8;
+    params.set("samplerate", format.samplerate);
+    params.set("channels", format.channels);
+    params.set("bitsPerSample", format.bits);
+    params.set("bytesPerSample", bytes);
+    params.set("samples", Any(format.samples));
+    params.set("duration", static_cast<double>(format.samples) / format.samplerate);
+    params.set("codec", Any(format.codec.c_str()));
+    if (format.bitrate > 0) params.set("aBitrate", format.bitrate);
+    if (format.mask != 0) params.set("channelMask", Any(static_cast<long long>(format.mask)));
+    describeStream(stream, params);
+    pcm = std::make_unique<QvPcm>();
+    pcm->init(0, format.channels, bytes, format.samplerate);
+}
+
+int SoundStream::read(int count) {
+    const long long left = reader_->format().samples - position_;
+    const long long most = INT_MAX / std::max(pcm->channels() * pcm->bytesPerSample(), 1);
+    count = static_cast<int>(std::min<long long>({count, left, most}));
+    pcm->setSamples(0);
+    if (count <= 0) return QvStatus::endOfStream;
+    if (count > pcm->size() && pcm->grow(count - pcm->size()) < 0) return QvStatus::outOfMemory;
+    const int got = reader_->read(*pcm, count);
+    if (got < 0) return QvStatus::cannotParse;
+    position_ += got;
+    pcm->setPosition(position_);
+    if (reader_->concealed() != concealed_) {
+        concealed_ = reader_->concealed();
+        params.set("concealed", Any(concealed_));
+    }
+    return got > 0 ? got : QvStatus::endOfStream;
+}
+
+bool SoundStream::seek(long long sample) {
+    if (sample < 0 || !reader_->seek(std::min(sample, reader_->format().samples))) return false;
+    position_ = sample;
+    pcm->setSamples(0);
+    pcm->setPosition(sample);
+    return true;
+}
+
+void SoundStream::setTruncated(long long expected) {
+    if (expected <= reader_->format().samples) return;
+    params.set("truncated", 1);
+    params.set("samplesExpected", Any(expected));
+}
+
+}  // namespace av

@@ -1,0 +1,50 @@
+// The streams of "avdec".
+#pragma once
+
+#include <memory>
+#include <string>
+
+#include "core/decode/basedecodepipe.h"
+#include "core/media/qvbuffer.h"
+#include "plugins/av/picture/picturereader.h"
+#include "plugins/av/sound/samplereader.h"
+
+struct AVStream;
+
+namespace av {
+
+// What all streams of a container say of themselves.
+void describeStream(const AVStream& stream, AnyDict& params);
+
+class PictureStream : public DPipeVideoStream {
+  public:
+    PictureStream(std::unique_ptr<PictureReader> reader, const AVStream& stream);
+
+    int read();  // as readFrame
+    bool seek(long long frame) {
+        return frame >= 0 && frame <= reader_->format().frames && reader_->seek(static_cast<int>(frame));
+    }
+    PictureReader& reader() { return *reader_; }
+    // The file was cut, or is damaged. Nothing changes if it has what it announces all the same.
+    void setTruncated(long long expected);
+
+  private:
+    std::unique_ptr<PictureReader> reader_;
+    int concealed_ = 0;
+};
+
+class SoundStream : public DPipeAudioStream {
+  public:
+    SoundStream(std::unique_ptr<SampleReader> reader, const AVStream& stream);
+
+    int read(int count);  // as readSamples
+    bool seek(long long sample);
+    SampleReader& reader() { return *reader_; }
+    void setTruncated(long long expected);
+
+  private:
+    std::unique_ptr<SampleReader> reader_;
+    long long position_ = 0, concealed_ = 0;
+};
+
+}  // namespace av

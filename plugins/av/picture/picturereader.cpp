@@ -1,0 +1,378 @@
+#include "plugins/av/picture/picturereader.h"
+
+#include <algorithm>
+#include <optional>
+#include <utility>
+
+#include "core/measure/mediatime.h"
+#include "core/media/qvframe.h"
+#include "plugins/av/picture/decodedpictures.h"
+#include "plugins/av/picture/picturecaptions.h"
+#include "plugins/av/picture/pictureform.h"
+#include "plugins/av/picture/picturetimes.h"
+#include "plugins/av/picture/picturewords.h"
+#include "plugins/av/source/limits.h"
+
+namespace av {
+
+namespace {
+
+constexpr std::size_t notShown = static_cast<std::size_t>(-1);
+// A jump of the clock that is longer than this is no picture that stays, in streams that are cut together.
+constexpr int longestStepOfBroadcast = 10;  // seconds
+constexpr int longestStepOfFile = 30 * 60 * 60;
+
+// Whether pictures that are not referred to are presented as soon as they are decoded, so that the order of
+// presentation follows from the times of decoding.
+bool refersToNeighbours(AVCodecID codec) {
+    return codec == AV_CODEC_ID_MPEG1VIDEO || codec == AV_CODEC_ID_MPEG2VIDEO || codec == AV_CODEC_ID_MPEG4 ||
+           codec == AV_CODEC_ID_VC1;
+}
+
+Rational rational(AVRational r) { return {r.num, r.den}; }
+
+}  // namespace
+
+// Presentation numbers count the pictures that are shown; packets those of the index.
+class PictureReader::Decoding {
+  public:
+    explicit Decoding(std::unique_ptr<DecodedPictures> source)
+        : source_(std::move(source)), held_(av_frame_alloc()), coming_(av_frame_alloc()) {}
+
+    bool begin(std::string& reason);
+    // The picture of that presentation number is in picture() then, or the last one before it that came.
+    Read show(std::size_t wanted, std::string& failure);
+    const AVFrame& picture() const { return *held_; }
+    const AVFrame& first() const { return *coming_; }  // after begin()
+    // In units of the time base.
+    std::int64_t firstTime() const { return hasTimes() ? pictures_.front().time : 0; }
+    // Whether the reader's frame has the picture already, which is shown again.
+    bool isWritten() const { return written_ == heldNumber_; }
+    bool shows(std::size_t number) const { return heldNumber_ == number; }
+    void setWritten() { written_ = heldNumber_; }
+    void describe(PictureFormat& format);
+
+    DecodedPictures& source() { return *source_; }
+    const std::vector<TimedPicture>& pictures() const { return pictures_; }
+    const PicturePlan& plan() const { return plan_; }
+    int concealed() const { return concealed_; }
+    std::unique_ptr<FormWriter> writer;
+
+  private:
+    std::unique_ptr<DecodedPictures> source_;
+    std::vector<TimedPicture> pictures_;
+    std::vector<std::size_t> number_;  // of a packet: its presentation number, or notShown
+    std::vector<bool> noStart_;        // of a packet: decoding can't start there, whatever its flag says
+    std::vector<bool> counted_;        // of a presentation number: it is among the concealed
+    PicturePlan plan_;
+    FramePtr held_, coming_;
+    std::optional<std::size_t> heldNumber_, comingNumber_, written_;
+    std::size_t startedAt_ = 0;  // packet
+    bool checkStart_ = false;    // the next picture shows whether decoding could start there
+    bool ended_ = false;
+    int concealed_ = 0;
+
+    bool decodeOrder(std::string& reason);
+    bool dropSecondFields();
+    bool isSecondField(std::size_t packet) const;
+    void numberPackets();
+    bool findFirst(std::string& reason);
+    std::size_t startFor(std::size_t wanted) const;
+    bool reach(std::size_t wanted, std::string& failure);
+    Read pull(std::string& failure);
+    void conceal(std::size_t number);
+    bool hasTimes() const;
+};
+
+bool PictureReader::Decoding::hasTimes() const {
+    const AVCodecDescriptor* const codec = avcodec_descriptor_get(source_->codec().codec_id);
+    if (!codec || !(codec->props & AV_CODEC_PROP_REORDER)) return true;
+    const auto& packets = source_->packets();
+    const auto without = static_cast<std::size_t>(
+        std::count_if(packets.begin(), packets.end(),
+                      [](const IndexedPacket& packet) { return packet.pts == AV_NOPTS_VALUE; }));
+    // Without a container all times are guesses as soon as one is missing.
+    const bool bare = (source_->container().iformat->flags & AVFMT_GENERIC_INDEX) != 0;
+    return without == 0 || (!bare && refersToNeighbours(source_->codec().codec_id));
+}
+
+// Without times only the codec knows the order of presentation: it decodes the stream once.
+bool PictureReader::Decoding::decodeOrder(std::string& reason) {
+    pictures_.clear();
+    while (true) {
+        switch (source_->next(*coming_)) {
+            case DecodedPictures::Next::picture:
+                pictures_.push_back(
+                    {static_cast<std::int64_t>(pictures_.size()), DecodedPictures::packetOf(*coming_)});
+                break;
+            case DecodedPictures::Next::failed: reason = source_->failure(); return false;
+            case DecodedPictures::Next::end: return source_->seek(0);
+        }
+    }
+}
+
+bool PictureReader::Decoding::isSecondField(std::size_t packet) const {
+    const auto& packets = source_->packets();
+    if (packet == 0 || packets[packet].position >= 0 || packets[packet - 1].position < 0) return false;
+    return packets[packet].pts == packets[packet - 1].pts + packets[packet - 1].duration;
+}
+
+// In transport streams the two fields of a picture are packets of their own, the second without a place. The
+// first pictures show whether it is so here.
+bool PictureReader::Decoding::dropSecondFields() {
+    constexpr int enough = 8;
+    const AVFieldOrder order = source_->stream().codecpar->field_order;
+    if (source_->codec().codec_id != AV_CODEC_ID_H264 || order == AV_FIELD_PROGRESSIVE) return true;
+    bool any = false;
+    for (std::size_t i = 0; i < source_->packets().size() && !any; ++i) any = isSecondField(i);
+    if (!any) return true;
+    bool fields = true;
+    for (int i = 0; i < enough && source_->next(*coming_) == DecodedPictures::Next::picture; ++i)
+        fields = fields && !isSecondField(DecodedPictures::packetOf(*coming_));
+    if (fields)
+        std::erase_if(pictures_, [&](const TimedPicture& picture) { return isSecondField(picture.packet); });
+    return source_->seek(0);
+}
+
+void PictureReader::Decoding::numberPackets() {
+    number_.assign(source_->packets().size(), notShown);
+    for (std::size_t i = 0; i < pictures_.size(); ++i) number_[pictures_[i].packet] = i;
+}
+
+// Pictures before the first one that comes can't be decoded: they need pictures that are not in the file.
+bool PictureReader::Decoding::findFirst(std::string& reason) {
+    while (!comingNumber_ && !ended_) {
+        if (pull(reason) == Read::failed) return false;
+        if (source_->position() > static_cast<std::size_t>(limits::silentPackets)) break;
+    }
+    if (!comingNumber_) {
+        reason = "none of its pictures can be decoded";
+        return false;
+    }
+    pictures_.erase(pictures_.begin(), pictures_.begin() + static_cast<std::ptrdiff_t>(*comingNumber_));
+    numberPackets();
+    comingNumber_ = 0;
+    return true;
+}
+
+bool PictureReader::Decoding::begin(std::string& reason) {
+    if (!held_ || !coming_) {
+        reason = "out of memory";
+        return false;
+    }
+    if (source_->packets().empty()) {
+        reason = "its stream of pictures is empty";
+        return false;
+    }
+    const AVStream& stream = source_->stream();
+    const Rational base = rational(stream.time_base);
+    const AVRational guess = av_guess_frame_rate(&source_->container(), &source_->stream(), nullptr);
+    const Rational rate = rational(guess);
+    noStart_.assign(source_->packets().size(), false);
+    std::vector<Rational> hints = {rational(stream.avg_frame_rate), rate, rational(stream.r_frame_rate)};
+    if (hasTimes()) {
+        const bool broadcast = (source_->container().iformat->flags & AVFMT_TS_DISCONT) != 0;
+        const std::int64_t usual = rate.num > 0 ? av_rescale_q(1, av_inv_q(guess), stream.time_base) : 1;
+        const std::int64_t longest =
+            base.den * (broadcast ? longestStepOfBroadcast : longestStepOfFile) / base.num;
+        pictures_ = presentedPictures(source_->packets(), std::max<std::int64_t>(usual, 1), longest);
+        if (!dropSecondFields()) {
+            reason = source_->failure();
+            return false;
+        }
+    } else if (!decodeOrder(reason)) {
+        return false;
+    }
+    numberPackets();
+    counted_.assign(pictures_.size(), false);
+    if (!findFirst(reason)) return false;
+    if (hasTimes()) {
+        const IndexedPacket& last = source_->packets()[pictures_.back().packet];
+        plan_ = planPictures(pictures_, base, hints, last.duration);
+    } else {
+        const bool known = rate.num > 0;
+        plan_ = planPictures(pictures_, known ? Rational{rate.den, rate.num} : Rational{1, 25}, {}, 1);
+    }
+    return true;
+}
+
+void PictureReader::Decoding::conceal(std::size_t number) {
+    if (counted_[number]) return;
+    counted_[number] = true;
+    ++concealed_;
+}
+
+// The next picture that is presented into coming_.
+PictureReader::Read PictureReader::Decoding::pull(std::string& failure) {
+    comingNumber_.reset();
+    while (!ended_) {
+        switch (source_->next(*coming_)) {
+            case DecodedPictures::Next::failed: failure = source_->failure(); return Read::failed;
+            case DecodedPictures::Next::end: ended_ = true; break;
+            case DecodedPictures::Next::picture: {
+                const std::size_t packet = DecodedPictures::packetOf(*coming_);
+                if (packet >= number_.size() || number_[packet] == notShown) continue;
+                comingNumber_ = number_[packet];
+                if (coming_->decode_error_flags || (coming_->flags & AV_FRAME_FLAG_CORRUPT))
+                    conceal(*comingNumber_);
+                return Read::picture;
+            }
+        }
+    }
+    return Read::end;
+}
+
+// The last packet at or before the picture's own from which it can be decoded as from the start: a key
+// picture that is presented before it. Pictures after a key picture that are presented before it refer to
+// what precedes it.
+std::size_t PictureReader::Decoding::startFor(std::size_t wanted) const {
+    const auto& packets = source_->packets();
+    for (std::size_t i = pictures_[wanted].packet; i > 0; --i)
+        if (packets[i].key() && !noStart_[i] && number_[i] != notShown && number_[i] <= wanted) return i;
+    return 0;
+}
+
+// Makes the pictures that come next reach the wanted one: goes on from here, or starts at a key picture.
+bool PictureReader::Decoding::reach(std::size_t wanted, std::string& failure) {
+    const std::size_t start = startFor(wanted);
+    const bool ahead = (heldNumber_ && *heldNumber_ <= wanted) || (comingNumber_ && *comingNumber_ <= wanted);
+    if (ahead && start <= source_->position()) return true;
+    heldNumber_.reset();
+    comingNumber_.reset();
+    ended_ = false;
+    startedAt_ = start;
+    checkStart_ = start > 0;
+    if (source_->seek(start)) return true;
+    failure = source_->failure();
+    return false;
+}
+
+PictureReader::Read PictureReader::Decoding::show(std::size_t wanted, std::string& failure) {
+    if (heldNumber_ == wanted) return Read::picture;
+    if (!reach(wanted, failure)) return Read::failed;
+    for (;;) {
+        if (!comingNumber_ && !ended_ && pull(failure) == Read::failed) return Read::failed;
+        if (std::exchange(checkStart_, false)) {
+            // Some containers flag as keys what needs pictures before it.
+            const bool started = comingNumber_ == number_[startedAt_] && coming_->key_frame;
+            if (!started) {
+                noStart_[startedAt_] = true;
+                comingNumber_.reset();
+                if (!reach(wanted, failure)) return Read::failed;
+                continue;
+            }
+        }
+        if (!comingNumber_ || *comingNumber_ > wanted) break;
+        std::swap(held_, coming_);
+        heldNumber_ = std::exchange(comingNumber_, std::nullopt);
+        if (*heldNumber_ == wanted) return Read::picture;
+    }
+    conceal(wanted);
+    if (heldNumber_) return Read::picture;
+    // Nothing before it came from that start: what the film shows then is further ahead of it.
+    if (startedAt_ > 0) {
+        noStart_[startedAt_] = true;
+        return show(wanted, failure);
+    }
+    failure = "its pictures can't be decoded";
+    return Read::failed;
+}
+
+void PictureReader::Decoding::describe(PictureFormat& format) {
+    const AVFrame& first = *coming_;
+    const AVStream& stream = source_->stream();
+    format.width = first.width;
+    format.height = first.height;
+    format.rate = QvFramerate(plan_.rate, fieldOrderOf(first));
+    format.variable = plan_.variable;
+    format.frames = plan_.frames;
+    const AVRational aspect =
+        av_guess_sample_aspect_ratio(&source_->container(), &source_->stream(), coming_.get());
+    if (aspect.num > 0 && aspect.den > 0) format.pixelAspect = av_q2d(aspect);
+    format.fieldOrder = fieldOrderOf(first);
+    format.colourMatrix = matrixOf(first);
+    const Turn turn = turnOf(stream);
+    format.rotation = turn.clockwise;
+    format.mirrored = turn.mirrored;
+    format.codec = codecName(source_->codec().codec_id);
+    format.bitrate = static_cast<double>(stream.codecpar->bit_rate);
+}
+
+PictureReader::PictureReader() = default;
+PictureReader::~PictureReader() = default;
+
+int PictureReader::concealed() const { return decoding_->concealed(); }
+
+std::unique_ptr<PictureReader> PictureReader::open(const MediaBytes& bytes, const std::string& format,
+                                                   int stream, std::shared_ptr<const PacketIndex> index,
+                                                   int threads, std::string& reason) {
+    std::unique_ptr<PictureReader> reader(new PictureReader);
+    auto source = DecodedPictures::open(bytes, format, stream, std::move(index), threads, reason);
+    if (!source) return nullptr;
+    reader->decoding_ = std::make_unique<Decoding>(std::move(source));
+    if (!reader->decoding_->begin(reason)) return nullptr;
+    if (!reader->describe()) {
+        reason = reader->failure_;
+        return nullptr;
+    }
+    return reader;
+}
+
+bool PictureReader::describe() {
+    Decoding& decoding = *decoding_;
+    decoding.describe(format_);
+    const AVFrame& first = decoding.first();
+    const PictureForm form = formOf(static_cast<AVPixelFormat>(first.format), isFullRange(first));
+    if (form.fourcc == 0) {
+        failure_ = "its pictures have a form that is not known";
+        return false;
+    }
+    format_.fourcc = static_cast<int>(form.fourcc);
+    format_.lost = form.lost;
+    frame_ = std::make_unique<QvFrame>();
+    if (format_.width > limits::side || format_.height > limits::side ||
+        frame_->init(form.fourcc, format_.width, format_.height) != 0) {
+        failure_ = "there is no memory for its pictures";
+        return false;
+    }
+    decoding.writer = std::make_unique<FormWriter>(form, format_.width, format_.height);
+    const AVRational base = decoding.source().stream().time_base;
+    zero_ = decoding.firstTime() * base.num;
+    zeroBase_ = base.den;
+    return true;
+}
+
+bool PictureReader::seek(int n) {
+    if (n < 0 || n > format_.frames) return false;
+    next_ = n;
+    return true;
+}
+
+PictureReader::Read PictureReader::read() {
+    if (next_ >= format_.frames) return Read::end;
+    const auto& shown = decoding_->plan().shown;
+    const auto n = static_cast<std::size_t>(next_);
+    const std::size_t wanted = shown.empty() ? n : shown[n];
+    const Read result = decoding_->show(wanted, failure_);
+    if (result != Read::picture) return result;
+    const AVFrame& picture = decoding_->picture();
+    if (!decoding_->isWritten()) {
+        if (!decoding_->writer->write(picture, *frame_)) {
+            failure_ = "a picture can't be converted";
+            return Read::failed;
+        }
+        decoding_->setWritten();
+    }
+    frame_->framerate = QvFramerate(format_.rate.rate(), fieldOrderOf(picture));
+    frame_->setYUVMatrix(static_cast<QvYUVMatrix>(format_.colourMatrix));
+    frame_->frameNr = next_++;
+    // A picture that stays says its captions once.
+    if (decoding_->shows(wanted) && (shown.empty() || n == 0 || shown[n - 1] != shown[n]))
+        carryCaptions(picture, MediaTime(frame_->frameNr, format_.rate, MediaTime::defaultTimescale),
+                      *frame_);
+    else if (frame_->subpic())
+        frame_->clearSubpic();
+    return Read::picture;
+}
+
+}  // namespace av

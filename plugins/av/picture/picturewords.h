@@ -1,0 +1,19 @@
+// What a stream of pictures is, in the engine's values.
+#pragma once
+
+#include <string>
+
+#include "plugins/av/source/avheaders.h"
+
+namespace av {
+
+std::string codecName(AVCodecID codec);    // as people know it: "H.264", "MPEG-2"
+int fieldOrderOf(const AVFrame& picture);  // 0 progressive, 1 top field first, 2 bottom field first
+int matrixOf(const AVFrame& picture);      // QvYUVMatrix
+struct Turn {
+    int clockwise = 0;  // degrees to be shown upright: 0, 90, 180, 270
+    bool mirrored = false;
+};
+Turn turnOf(const AVStream& stream);
+
+}  // namespace av

@@ -1,0 +1,40 @@
+// The headers of the codec libraries, which are C, and owners for what they allocate.
+#pragma once
+
+#include <memory>
+#include <string>
+
+// Their macros and inline functions convert as C does.
+#pragma GCC diagnostic push
+#pragma GCC diagnostic ignored "-Wconversion"
+#pragma GCC diagnostic ignored "-Wsign-conversion"
+extern "C" {
+#include <libavcodec/avcodec.h>
+#include <libavformat/avformat.h>
+#include <libavutil/avutil.h>
+#include <libavutil/display.h>
+#include <libavutil/imgutils.h>
+#include <libavutil/mem.h>
+#include <libavutil/opt.h>
+#include <libavutil/pixdesc.h>
+}
+#pragma GCC diagnostic pop
+
+namespace av {
+
+struct Free {
+    void operator()(AVPacket* packet) const { av_packet_free(&packet); }
+    void operator()(AVFrame* frame) const { av_frame_free(&frame); }
+    void operator()(AVCodecContext* context) const { avcodec_free_context(&context); }
+};
+using PacketPtr = std::unique_ptr<AVPacket, Free>;
+using FramePtr = std::unique_ptr<AVFrame, Free>;
+using CodecPtr = std::unique_ptr<AVCodecContext, Free>;
+
+inline std::string errorText(int code) {
+    char text[AV_ERROR_MAX_STRING_SIZE] = {};
+    av_strerror(code, text, sizeof text);
+    return text;
+}
+
+}  // namespace av

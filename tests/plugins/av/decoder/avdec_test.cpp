@@ -1,0 +1,125 @@
+// Films through the tool, with the plug-in that it loads by itself.
+#include <gmock/gmock.h>
+
+#include "tests/plugins/av/films.h"
+
+namespace {
+
+using testing::HasSubstr;
+using testing::Not;
+
+class FilmsInTheTool : public Films {
+  protected:
+    Outcome tarsel(Words words) const {
+        words.insert(words.begin(), QV_BINARY_DIR "/bin/tarsel");
+        ProcessOptions options;
+        options.folder = folder.path().string();
+        return runProgram(words, options);
+    }
+};
+
+TEST_F(FilmsInTheTool, areShownAndTranscodedToTheirLastPicture) {
+    const std::string file =
+        film("film.mp4", {"-c:v", "mpeg4", "-g", "12", "-bf", "2", "-metadata:s:v", "language=deu"});
+    const Outcome shown = tarsel({"info", "film.mp4"});
+    EXPECT_EQ(shown.status, 0) << shown.err;
+    for (const char* part : {"avdec", "MPEG-4", "96x64", "25 fps", "50 frames"})
+        EXPECT_THAT(shown.out, HasSubstr(part));
+
+    const Outcome made = tarsel({"transcode", "film.mp4", "-o", "film.i420"});
+    EXPECT_EQ(made.status, 0) << made.err;
+    EXPECT_EQ(TempFolder::read(folder.file("film.i420")), pictures(file, "yuv420p"));
+
+    const Outcome cut = tarsel({"transcode", "film.mp4", "--from", "31f", "--to", "34f", "-o", "cut.i420"});
+    EXPECT_EQ(cut.status, 0) << cut.err;
+    const std::size_t size = 96 * 64 * 3 / 2;
+    EXPECT_EQ(TempFolder::read(folder.file("cut.i420")),
+              pictures(file, "yuv420p").substr(31 * size, 3 * size));
+
+    const Outcome picture = tarsel({"frame", "film.mp4", "--at", "1", "-o", "one.png"});
+    EXPECT_EQ(picture.status, 0) << picture.err;
+}
+
+TEST_F(FilmsInTheTool, areUnknownWithoutThePlugIn) {
+    film("film.mp4", {"-c:v", "mpeg4"});
+    const Outcome o = tarsel({"--no-plugins", "info", "film.mp4"});
+    EXPECT_EQ(o.status, 3);
+    EXPECT_THAT(o.err, HasSubstr("mp4"));
+    EXPECT_THAT(tarsel({"--no-plugins", "modules"}).out, Not(HasSubstr("Film reader")));
+    EXPECT_THAT(tarsel({"modules"}).out, HasSubstr("Film reader"));
+}
+
+TEST_F(FilmsInTheTool, thatAreNoneAreRefusedInOneLine) {
+    film("film.mp4", {"-c:v", "mpeg4"});
+    const std::string bytes = TempFolder::read(folder.file("film.mp4"));
+    folder.write("secret.txt", "what no film may name");
+    const struct {
+        const char* name;
+        std::string bytes;
+    } cases[] = {
+        {"empty.mp4", ""},
+        {"text.mkv", "This is a letter, and no film."},
+        {"headless.mp4", bytes.substr(0, 200)},
+        {"list.mp4", "#EXTM3U\n#EXT-X-TARGETDURATION:1\n#EXTINF:1,\nfilm.mp4\n#EXT-X-ENDLIST\n"},
+        {"list.mkv", "ffconcat version 1.0\nfile film.mp4\n"},
+    };
+    for (const auto& c : cases) {
+        folder.write(c.name, c.bytes);
+        const Outcome o = tarsel({"transcode", c.name, "-o", "out.avi"});
+        EXPECT_EQ(o.status, 3) << c.name << o.err;
+        EXPECT_EQ(std::count(o.err.begin(), o.err.end(), '\n'), 1) << o.err;
+        EXPECT_THAT(o.err, HasSubstr(c.name));
+    }
+    EXPECT_EQ(tarsel({"info", "missing.mp4"}).status, 3);
+}
+
+TEST_F(FilmsInTheTool, thatWereCutGiveWhatIsThere) {
+    for (const char* ext : {"mp4", "mkv", "avi"}) {
+        const std::string name = std::string("film.") + ext, cut = std::string("cut.") + ext;
+        const std::string file = film(name, {"-c:v", "mpeg4", "-g", "12", "-movflags", "+faststart"},
+                                      "testsrc2=size=96x64:rate=25:duration=8");
+        const std::string bytes = TempFolder::read(file);
+        folder.write(cut, bytes.substr(0, bytes.size() / 2));
+        const Outcome refused = tarsel({"transcode", cut, "-y", "-o", "out.i420"});
+        EXPECT_EQ(refused.status, 3) << cut << refused.err;
+        EXPECT_THAT(refused.err, HasSubstr("of 200 frames"));
+        const Outcome taken = tarsel({"transcode", "--accept-partial", cut, "-y", "-o", "out.i420"});
+        EXPECT_EQ(taken.status, 0) << taken.err;
+        // All but the last of them, of which a part may be there.
+        const std::string made = TempFolder::read(folder.file("out.i420"));
+        const std::size_t size = 96 * 64 * 3 / 2, whole = made.size() / size - 1;
+        EXPECT_GT(whole, 50u) << cut;
+        EXPECT_TRUE(made.substr(0, whole * size) == pictures(file, "yuv420p").substr(0, whole * size)) << cut;
+    }
+}
+
+TEST_F(FilmsInTheTool, bringTheirSound) {
+    const std::string file = folder.file("film.mkv");
+    ASSERT_EQ(ffmpeg({"-f", "lavfi", "-i", kMoving, "-f", "lavfi", "-i", "sine=frequency=440:duration=2",
+                      "-c:v", "mpeg4", "-c:a", "flac", file})
+                  .status,
+              0);
+    const Outcome o = tarsel({"transcode", "film.mkv", "-o", "film.wav"});
+    EXPECT_EQ(o.status, 0) << o.err;
+    const auto samples = [&](const std::string& name) {
+        const std::string raw = folder.file("samples.raw");
+        EXPECT_EQ(ffmpeg({"-i", name, "-f", "s16le", raw}).status, 0);
+        return TempFolder::read(raw);
+    };
+    EXPECT_EQ(samples(file).size(), 2u * 88200);
+    EXPECT_TRUE(samples(folder.file("film.wav")) == samples(file));
+    const Outcome part = tarsel({"transcode", "film.mkv", "--from", "20f", "--to", "30f", "-o", "part.wav"});
+    EXPECT_EQ(part.status, 0) << part.err;
+    EXPECT_TRUE(samples(folder.file("part.wav")) == samples(file).substr(2 * 20 * 1764, 2 * 10 * 1764));
+}
+
+TEST_F(FilmsInTheTool, keepTheirFieldsAndAspect) {
+    film("fields.mpg",
+         {"-c:v", "mpeg2video", "-flags", "+ildct+ilme", "-top", "1", "-vf", "setfield=tff,setdar=4/3"});
+    const Outcome o = tarsel({"info", "--json", "fields.mpg"});
+    EXPECT_EQ(o.status, 0) << o.err;
+    EXPECT_THAT(o.out, HasSubstr("\"scan\": \"top first\""));
+    EXPECT_THAT(o.out, HasSubstr("\"frame_aspect\": 1.333"));
+}
+
+}  // namespace

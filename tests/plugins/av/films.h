@@ -1,0 +1,47 @@
+// Small films made by the ffmpeg command, and what it says are their pictures.
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include <gtest/gtest.h>
+
+#include "tests/support/process.h"
+#include "tests/support/temp_folder.h"
+
+class Films : public testing::Test {
+  protected:
+    using Words = std::vector<std::string>;
+
+    void SetUp() override {
+        if (ffmpeg({"-version"}).status != 0) GTEST_SKIP() << "there is no ffmpeg here";
+    }
+
+    static Outcome ffmpeg(const Words& arguments) {
+        Words words = {"/usr/bin/env", "ffmpeg", "-nostdin", "-v", "error", "-y"};
+        words.insert(words.end(), arguments.begin(), arguments.end());
+        return runProgram(words);
+    }
+    // A film of moving pictures with those options; skips the test where ffmpeg lacks the codec.
+    std::string film(const std::string& name, const Words& options,
+                     const std::string& source = kMoving) const {
+        const std::string file = folder.file(name);
+        Words words = {"-f", "lavfi", "-i", source};
+        words.insert(words.end(), options.begin(), options.end());
+        words.push_back(file);
+        const Outcome made = ffmpeg(words);
+        EXPECT_EQ(made.status, 0) << made.err;
+        return file;
+    }
+    // Its pictures one after the other in that layout.
+    std::string pictures(const std::string& film, const std::string& layout) const {
+        const std::string raw = folder.file("pictures.raw");
+        const Outcome read = ffmpeg({"-i", film, "-map", "0:v:0", "-f", "rawvideo", "-pix_fmt", layout,
+                                     "-fps_mode", "passthrough", raw});
+        EXPECT_EQ(read.status, 0) << read.err;
+        return TempFolder::read(raw);
+    }
+
+    static constexpr const char* kMoving = "testsrc2=size=96x64:rate=25:duration=2";
+    TempFolder folder;
+};

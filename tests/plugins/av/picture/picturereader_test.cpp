@@ -1,0 +1,161 @@
+#include "plugins/av/picture/picturereader.h"
+
+#include <cstring>
+#include <random>
+
+#include "core/media/qvframe.h"
+#include "core/value/any.h"
+#include "tests/plugins/av/films.h"
+#include "tests/support/engine.h"
+
+namespace {
+
+using av::PictureReader;
+
+// The planes without padding; words moved back to the low bits.
+std::string bytesOf(const QvFrame& frame, int shift) {
+    std::string bytes;
+    for (int plane = 0; plane < frame.planes(); ++plane)
+        for (int y = 0; y < frame.height(plane); ++y) {
+            const auto* row = frame.plane(plane) + std::ptrdiff_t{y} * frame.stride(plane);
+            const int count = frame.width(plane) * frame.pixelBytes(plane);
+            if (shift == 0) {
+                bytes.append(reinterpret_cast<const char*>(row), static_cast<std::size_t>(count));
+                continue;
+            }
+            for (int i = 0; i < count; i += 2) {
+                const int value = (row[i] | row[i + 1] << 8) >> shift;
+                bytes += {static_cast<char>(value), static_cast<char>(value >> 8)};
+            }
+        }
+    return bytes;
+}
+
+class PictureReaderOfFilms : public Films {
+  protected:
+    std::unique_ptr<PictureReader> open(const std::string& film, int threads = 2) {
+        bytes_ = std::make_unique<av::MediaBytes>(Any(film.c_str()));
+        std::string reason;
+        const auto input = av::MediaInput::open(*bytes_, "", reason);
+        EXPECT_TRUE(input) << reason;
+        if (!input) return nullptr;
+        const std::shared_ptr<const av::PacketIndex> index = av::PacketIndex::build(*input, reason);
+        EXPECT_TRUE(index) << reason;
+        auto reader = index ? PictureReader::open(*bytes_, "", 0, index, threads, reason) : nullptr;
+        EXPECT_TRUE(reader) << reason;
+        return reader;
+    }
+
+    // Every picture in order, then in any order, against what ffmpeg makes of the film.
+    void compare(const std::string& film, const std::string& layout, int shift, int frames) {
+        SCOPED_TRACE(film);
+        const auto reader = open(film);
+        ASSERT_TRUE(reader);
+        const std::string expected = pictures(film, layout);
+        ASSERT_EQ(reader->format().frames, frames);
+        const std::size_t size = expected.size() / static_cast<std::size_t>(frames);
+        ASSERT_EQ(size * static_cast<std::size_t>(frames), expected.size());
+        const auto same = [&](int n) {
+            if (reader->read() != PictureReader::Read::picture || reader->frame().frameNr != n) return false;
+            const std::string bytes = bytesOf(reader->frame(), shift);
+            return bytes.size() == size &&
+                   std::memcmp(bytes.data(), expected.data() + size * static_cast<std::size_t>(n), size) == 0;
+        };
+        for (int n = 0; n < frames; ++n) ASSERT_TRUE(same(n)) << "picture " << n;
+        EXPECT_EQ(reader->read(), PictureReader::Read::end);
+        std::mt19937 random(1);
+        for (int i = 0; i < 40; ++i) {
+            const int n = static_cast<int>(random() % static_cast<unsigned>(frames));
+            ASSERT_TRUE(reader->seek(n));
+            ASSERT_TRUE(same(n)) << "after a seek to picture " << n;
+        }
+        EXPECT_EQ(reader->concealed(), 0);
+    }
+
+    EngineScope engine_;
+    std::unique_ptr<av::MediaBytes> bytes_;
+};
+
+TEST_F(PictureReaderOfFilms, everyPictureIsTheSameInOrderAndAfterSeeks) {
+    const struct {
+        const char* name;
+        Words options;
+        const char* layout;
+        int shift;
+    } cases[] = {
+        {"open.ts", {"-c:v", "mpeg2video", "-g", "12", "-bf", "2", "-flags", "-cgop"}, "yuv420p", 0},
+        {"closed.mpg",
+         {"-c:v", "mpeg2video", "-g", "10", "-bf", "2", "-flags", "+cgop", "-sc_threshold", "1000000000"},
+         "yuv420p",
+         0},
+        {"packed.avi", {"-c:v", "mpeg4", "-g", "15", "-bf", "2"}, "yuv420p", 0},
+        {"b.mp4", {"-c:v", "mpeg4", "-g", "15", "-bf", "2"}, "yuv420p", 0},
+        {"bare.m2v", {"-c:v", "mpeg2video", "-g", "12", "-bf", "2"}, "yuv420p", 0},
+        {"intra.mov", {"-c:v", "prores_ks", "-profile:v", "2"}, "yuv422p10le", -1},
+        {"lossless.mkv", {"-c:v", "ffv1", "-pix_fmt", "yuv420p10le"}, "yuv420p10le", 6},
+        {"half.mkv", {"-c:v", "ffv1", "-pix_fmt", "yuv422p"}, "yuyv422", 0},
+        {"rgb.mkv", {"-c:v", "ffv1", "-pix_fmt", "bgra"}, "bgra", 0},
+        {"deep.mkv", {"-c:v", "ffv1", "-pix_fmt", "gbrp12le"}, "bgra64le", 0},
+    };
+    for (const auto& c : cases) {
+        const std::string file = film(c.name, c.options);
+        if (c.shift >= 0) compare(file, c.layout, c.shift, 50);
+    }
+}
+
+TEST_F(PictureReaderOfFilms, anEditListDecidesWhatIsThere) {
+    film("whole.mp4", {"-c:v", "mpeg4", "-g", "25", "-bf", "2"});
+    const std::string cut = folder.file("cut.mp4");
+    ASSERT_EQ(ffmpeg({"-ss", "0.4", "-i", folder.file("whole.mp4"), "-c", "copy", cut}).status, 0);
+    compare(cut, "yuv420p", 0, 40);
+}
+
+TEST_F(PictureReaderOfFilms, aVariableRateBecomesAUsualOne) {
+    // Pictures 10 to 19 are not there: the one before them stays.
+    const std::string file = film("gap.mkv", {"-vf", "select=not(between(n\\,10\\,19))", "-fps_mode",
+                                              "passthrough", "-c:v", "ffv1", "-pix_fmt", "yuv420p"});
+    const auto reader = open(file);
+    ASSERT_TRUE(reader);
+    EXPECT_TRUE(reader->format().variable);
+    EXPECT_EQ(reader->format().rate.rate(), QvRatio(24000, 1001));  // nearest to 39 pictures in 1.96 s
+    const std::string expected = pictures(file, "yuv420p");
+    const std::size_t size = expected.size() / 40;
+    for (int n = 0; n < reader->format().frames; ++n) {
+        ASSERT_EQ(reader->read(), PictureReader::Read::picture);
+        const int due = (n * 1001 + 24) / (24 * 40);  // of the source, whose pictures last 40 ms
+        const int shown = due < 10 ? due : due < 20 ? 9 : due - 10;
+        EXPECT_TRUE(bytesOf(reader->frame(), 0) ==
+                    expected.substr(static_cast<std::size_t>(shown) * size, size))
+            << n;
+    }
+    EXPECT_EQ(reader->format().frames, 48);
+}
+
+TEST_F(PictureReaderOfFilms, aHoleInTheFileIsCountedAndTheRestIsExact) {
+    const std::string file = film("hole.mkv", {"-c:v", "mpeg2video", "-g", "1", "-q:v", "2"});
+    const auto whole = open(file);
+    ASSERT_TRUE(whole);
+    std::string bytes = TempFolder::read(file);
+    std::string reason;
+    const auto input = av::MediaInput::open(*bytes_, "", reason);
+    ASSERT_TRUE(input) << reason;
+    const auto index = av::PacketIndex::build(*input, reason);
+    ASSERT_TRUE(index) << reason;
+    // Within the data of picture 20.
+    bytes.replace(static_cast<std::size_t>(index->packets(0)[20].position) + 300, 20, 20, '\x55');
+    folder.write("damaged.mkv", bytes);
+    const auto damaged = open(folder.file("damaged.mkv"));
+    ASSERT_TRUE(damaged);
+    const int frames = whole->format().frames;
+    ASSERT_EQ(damaged->format().frames, frames);
+    int different = 0;
+    for (int n = 0; n < frames; ++n) {
+        ASSERT_EQ(whole->read(), PictureReader::Read::picture);
+        ASSERT_EQ(damaged->read(), PictureReader::Read::picture);
+        different += bytesOf(whole->frame(), 0) != bytesOf(damaged->frame(), 0);
+    }
+    EXPECT_EQ(different, 1);
+    EXPECT_EQ(damaged->concealed(), 1);
+}
+
+}  // namespace

@@ -1,0 +1,92 @@
+#include "plugins/av/source/mediainput.h"
+
+#include "plugins/av/index/packetindex.h"
+#include "plugins/av/source/avheaders.h"
+#include "tests/plugins/av/films.h"
+#include "tests/support/engine.h"
+
+namespace {
+
+using av::MediaInput;
+
+class MediaInputOfFilms : public Films {
+  protected:
+    EngineScope engine_;
+};
+
+// Counts what is read, and ends early or fails on demand.
+class WatchedSource : public QvByteSource {
+  public:
+    explicit WatchedSource(std::string bytes) : bytes_(std::move(bytes)) {}
+    bool fails = false;
+
+  protected:
+    long long readSome(void* to, std::size_t count) override {
+        if (fails) {
+            setReason("the cable was pulled");
+            return -1;
+        }
+        const std::size_t n = std::min(count, bytes_.size() - std::min(bytes_.size(), at_));
+        bytes_.copy(static_cast<char*>(to), n, at_);
+        at_ += n;
+        return static_cast<long long>(n);
+    }
+    bool canMove() const override { return true; }
+    bool moveTo(long long position) override {
+        at_ = static_cast<std::size_t>(position);
+        return true;
+    }
+    long long length() override { return static_cast<long long>(bytes_.size()); }
+
+  private:
+    std::string bytes_;
+    std::size_t at_ = 0;
+};
+
+TEST_F(MediaInputOfFilms, readersOfOneSourceDoNotDisturbEachOther) {
+    WatchedSource source(TempFolder::read(film("film.mkv", {"-c:v", "mpeg4", "-g", "5"})));
+    const av::MediaBytes bytes(source, Any("film.mkv"));
+    std::string reason;
+    const auto first = MediaInput::open(bytes, "", reason), second = MediaInput::open(bytes, "", reason);
+    ASSERT_TRUE(first && second) << reason;
+    const av::PacketPtr a(av_packet_alloc()), b(av_packet_alloc());
+    for (int i = 0; i < 50; ++i) {
+        ASSERT_EQ(first->read(*a), MediaInput::Read::packet);
+        ASSERT_EQ(second->read(*b), MediaInput::Read::packet);
+        EXPECT_EQ(a->pts, b->pts);
+        EXPECT_EQ(a->size, b->size);
+        av_packet_unref(a.get());
+        av_packet_unref(b.get());
+    }
+    EXPECT_EQ(first->read(*a), MediaInput::Read::end);
+    source.fails = true;
+    ASSERT_TRUE(!second->rewind() || second->read(*b) == MediaInput::Read::failed);
+    EXPECT_NE(second->failure().find("cable"), std::string::npos) << second->failure();
+}
+
+TEST_F(MediaInputOfFilms, aSeekFindsEveryPacketOfTheIndex) {
+    for (const char* name : {"film.mp4", "film.ts", "film.mkv", "film.avi", "film.mpg", "film.m2v"}) {
+        SCOPED_TRACE(name);
+        const av::MediaBytes bytes{Any(film(name, {"-c:v", "mpeg2video", "-g", "12", "-bf", "2"}).c_str())};
+        std::string reason;
+        const auto input = MediaInput::open(bytes, "", reason);
+        ASSERT_TRUE(input) << reason;
+        const auto index = av::PacketIndex::build(*input, reason);
+        ASSERT_TRUE(index) << reason;
+        ASSERT_EQ(index->packets(0).size(), 50u);
+        const av::PacketPtr packet(av_packet_alloc());
+        for (const std::size_t wanted : {49u, 0u, 31u, 24u, 7u}) {
+            ASSERT_TRUE(input->seekTo(0, index->packets(0)[wanted].which(), wanted))
+                << wanted << input->failure();
+            // As many follow as in the index: it is this one.
+            std::size_t follow = 0;
+            while (input->read(*packet) == MediaInput::Read::packet) {
+                ++follow;
+                av_packet_unref(packet.get());
+            }
+            EXPECT_EQ(follow, 50 - wanted);
+        }
+    }
+}
+
+}  // namespace
