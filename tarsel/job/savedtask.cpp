@@ -37,16 +37,19 @@ AnyDict newState(const JobParts& parts, const JobOptions& options) {
 
 }  // namespace
 
-void saveTask(JobParts& parts, const JobOptions& options, Signals& signals) {
-    if (!parts.outputs.hasTask()) return;
+AnyDict storedState(JobParts& parts, const JobOptions& options) {
     AnyDict state =
         parts.stored ? static_cast<const AnyDict&>(parts.stored->state()) : newState(parts, options);
     if (!options.post.empty()) state.set("postProcess", options.post.c_str());
+    makeAbsolute(state);
+    return state;
+}
+
+void saveTask(JobParts& parts, const JobOptions& options, Signals& signals) {
+    if (!parts.outputs.hasTask()) return;
+    AnyDict state = storedState(parts, options);
     const Signals::Watch storing(signals, {.first = {}, .second = [&] { return parts.outputs.leave(); }});
-    if (options.relative)
-        makeRelative(state, fs::path(options.saveTask).parent_path().string());
-    else
-        makeAbsolute(state);
+    if (options.relative) makeRelative(state, fs::path(options.saveTask).parent_path().string());
     const std::string reason = writeTask(state, parts.outputs.beginTask());
     if (!reason.empty()) throw writeFailure(options.saveTask, parts.outputs.withFinalNames(reason));
 }

@@ -1,0 +1,58 @@
+// A program that this one starts and that ends with it, whatever ends it.
+#pragma once
+
+#include <chrono>
+#include <span>
+#include <string>
+#include <vector>
+
+#include <sys/types.h>
+
+#include "tarsel/host/outputs/descriptor.h"
+
+// In a process group of its own, so that the keys of a terminal reach it only through signal(). It reads
+// nothing, and all that it writes to its standard streams comes back here. The thread that starts it has to
+// live as long as it.
+class ChildProcess {
+  public:
+    // words[0] is the file to run. Throws Failure if there is no room for another process.
+    explicit ChildProcess(const std::vector<std::string>& words);
+    // Kills it if it has not ended.
+    ~ChildProcess();
+    ChildProcess(const ChildProcess&) = delete;
+    ChildProcess& operator=(const ChildProcess&) = delete;
+
+    // For waitForAny: there is something to read.
+    int descriptor() const { return output_.get(); }
+    // Appends what there is without waiting for more. False at the end of it.
+    bool read(std::string& to);
+    // Waits for its end: the exit status, or 128 plus the number of the signal that ended it.
+    int wait();
+    // Whether it has ended after so many milliseconds at most. From any thread.
+    bool endsWithin(int milliseconds) const;
+    // From any thread; without effect once it has ended.
+    void signal(int number) const;
+
+  private:
+    pid_t pid_ = -1;
+    Descriptor output_, handle_;
+    int status_ = -1;
+};
+
+// Wakes a thread that is in waitForAny.
+class Bell {
+  public:
+    Bell();
+    void ring() const;  // from any thread
+    void silence() const;
+    int descriptor() const { return bell_.get(); }
+
+  private:
+    Descriptor bell_;
+};
+
+// Until one of them can be read, or so many milliseconds have passed; negative: without an end.
+void waitForAny(std::span<const int> descriptors, int milliseconds);
+
+// The program that is running, as a file.
+std::string ownProgram();
