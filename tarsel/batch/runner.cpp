@@ -1,7 +1,6 @@
 #include "tarsel/batch/runner.h"
 
 #include <algorithm>
-#include <csignal>
 #include <cstdio>
 
 #include "tarsel/batch/journal.h"
@@ -56,10 +55,10 @@ void BatchRunner::prepare() {
 }
 
 BatchResult BatchRunner::run() {
-    const NamedLock lock(file_.runLock(), file_.shown());
     prepare();
+    const NamedLock lock(file_.runLock(), file_.shown());
     start_ = secondsSince1970();
-    const Signals::Watch watch(signals_, {.first = [this](int) { stopAll(SIGTERM); },
+    const Signals::Watch watch(signals_, {.first = [this](int) { stopAll(); },
                                           .second = [this] { return endAtOnce(); },
                                           .report = [this] { bell_.ring(); },
                                           .suspend = [this] { suspended_ = setPaused(true); },
@@ -140,9 +139,9 @@ void BatchRunner::startChild(Entry& entry) {
         // A pause is one within the task, wherever it came.
         if (paused_) {
             entry.child->time().pause();
-            entry.child->process().signal(SIGTSTP);
+            entry.child->process().pause();
         }
-        if (stopping_) entry.child->process().signal(SIGTERM);
+        if (stopping_) entry.child->process().askToEnd();
     } catch (const Failure& failed) {
         fail(entry, static_cast<int>(failed.exit()), failed.what());
     }
@@ -171,11 +170,11 @@ void BatchRunner::limit(Entry& entry) {
     const double over = options_.timeout < 0 ? -1 : entry.child->time().seconds() - options_.timeout;
     if (over > 0 && !entry.timedOut) {
         entry.timedOut = true;
-        entry.child->process().signal(SIGTERM);
+        entry.child->process().askToEnd();
     }
     if (over > kPatience && !entry.killed) {
         entry.killed = true;
-        entry.child->process().signal(SIGKILL);
+        entry.child->process().kill();
     }
 }
 
@@ -269,24 +268,20 @@ void BatchRunner::show() {
 
 // --- Signals and keys, on threads of their own.
 
-void BatchRunner::stopAll(int signal) {
+void BatchRunner::stopAll() {
     stopping_ = true;
     const std::lock_guard guard(lock_);
     for (const Entry& entry : entries_)
-        if (entry.child) {
-            entry.child->process().signal(signal);
-            entry.child->process().signal(SIGCONT);
-        }
+        if (entry.child) entry.child->process().askToEnd();
     bell_.ring();
 }
 
 // A second signal makes them end at once as well, which takes a moment. Nothing of them is left then.
 bool BatchRunner::endAtOnce() {
-    stopAll(SIGTERM);
+    stopAll();
     const std::lock_guard guard(lock_);
     for (const Entry& entry : entries_)
-        if (entry.child && !entry.child->process().endsWithin(kLastPatience))
-            entry.child->process().signal(SIGKILL);
+        if (entry.child && !entry.child->process().endsWithin(kLastPatience)) entry.child->process().kill();
     return false;
 }
 
@@ -297,7 +292,7 @@ bool BatchRunner::setPaused(bool paused) {
     for (const Entry& entry : entries_)
         if (entry.child) {
             paused ? entry.child->time().pause() : entry.child->time().resume();
-            entry.child->process().signal(paused ? SIGTSTP : SIGCONT);
+            paused ? entry.child->process().pause() : entry.child->process().resume();
         }
     bell_.ring();
     return true;

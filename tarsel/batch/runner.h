@@ -58,7 +58,7 @@ class BatchRunner {
     void fail(Entry& entry, int status, const std::string& line);
     void show();
     void say(const std::string& line);
-    void stopAll(int signal);
+    void stopAll();
     bool endAtOnce();
     bool setPaused(bool paused);  // whether that is a change
     void pressed(char key);

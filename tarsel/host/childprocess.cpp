@@ -85,6 +85,15 @@ void ChildProcess::signal(int number) const {
     if (handle_) syscall(SYS_pidfd_send_signal, handle_.get(), number, nullptr, 0);
 }
 
+void ChildProcess::askToEnd() const {
+    signal(SIGTERM);
+    signal(SIGCONT);
+}
+
+void ChildProcess::kill() const { signal(SIGKILL); }
+void ChildProcess::pause() const { signal(SIGTSTP); }
+void ChildProcess::resume() const { signal(SIGCONT); }
+
 Bell::Bell() : bell_(eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK)) {
     if (!bell_) throw systemFailure(Msg::childNotStarted, "eventfd", errno);
 }

@@ -8,9 +8,9 @@
 
 #include <sys/types.h>
 
-#include "tarsel/host/outputs/descriptor.h"
+#include "tarsel/host/descriptor.h"
 
-// In a process group of its own, so that the keys of a terminal reach it only through signal(). It reads
+// In a process group of its own, so that the keys of a terminal don't reach it. It reads
 // nothing, and all that it writes to its standard streams comes back here. The thread that starts it has to
 // live as long as it.
 class ChildProcess {
@@ -30,10 +30,15 @@ class ChildProcess {
     int wait();
     // Whether it has ended after so many milliseconds at most. From any thread.
     bool endsWithin(int milliseconds) const;
-    // From any thread; without effect once it has ended.
-    void signal(int number) const;
+    // These from any thread, without effect once it has ended.
+    void askToEnd() const;  // SIGTERM, which one that is paused sees as well
+    void kill() const;
+    void pause() const;
+    void resume() const;
 
   private:
+    void signal(int number) const;
+
     pid_t pid_ = -1;
     Descriptor output_, handle_;
     int status_ = -1;

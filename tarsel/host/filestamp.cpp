@@ -9,7 +9,7 @@
 
 #include <qvplugcore/qvplugcore.h>
 
-#include "tarsel/host/outputs/descriptor.h"
+#include "tarsel/host/descriptor.h"
 #include "tarsel/words/messages.h"
 
 namespace {

@@ -8,7 +8,7 @@
 #include <string_view>
 #include <vector>
 
-#include "tarsel/host/outputs/descriptor.h"
+#include "tarsel/host/descriptor.h"
 
 class RecordFile {
   public:

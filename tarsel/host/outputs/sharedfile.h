@@ -4,7 +4,7 @@
 #include <functional>
 #include <string>
 
-#include "tarsel/host/outputs/descriptor.h"
+#include "tarsel/host/descriptor.h"
 #include "tarsel/words/messages.h"
 
 class SharedFile {
