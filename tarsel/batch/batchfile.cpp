@@ -20,11 +20,6 @@ void save(QvBatchList& list, const std::string& name) {
     throw systemFailure(Msg::batchNotWritten, name, errno != 0 ? errno : EIO);
 }
 
-bool isNumber(const std::string& word) {
-    return !word.empty() && word.size() < kShortestId &&
-           word.find_first_not_of("0123456789") == std::string::npos;
-}
-
 }  // namespace
 
 BatchFile::BatchFile(const std::string& name) : shown_(name), name_(resolvedName(name)) {}
@@ -71,9 +66,14 @@ void BatchFile::change(const std::function<void(QvBatchList& list)>& change) con
     shared.replace([&](const std::string& name) { save(list, name); });
 }
 
+bool isTaskNumber(const std::string& word) {
+    return !word.empty() && word.size() < kShortestId &&
+           word.find_first_not_of("0123456789") == std::string::npos;
+}
+
 size_t findTask(const std::vector<BatchTask>& tasks, const std::string& word, const BatchFile& file) {
     const std::string count = std::to_string(tasks.size()) + (tasks.size() == 1 ? " task" : " tasks");
-    if (isNumber(word)) {
+    if (isTaskNumber(word)) {
         const size_t number = std::stoul(word);
         if (number < 1 || number > tasks.size()) throw failure(Msg::batchNoTask, {file.shown(), word, count});
         return number - 1;

@@ -38,6 +38,8 @@ class BatchFile {
     std::string shown_, name_;
 };
 
+// Whether a word is the number of a task, be there such a task or not.
+bool isTaskNumber(const std::string& word);
 // The index in `tasks` of the task that a word names: its number, or the first digits of its name. Throws
 // Failure (usage).
 size_t findTask(const std::vector<BatchTask>& tasks, const std::string& word, const BatchFile& file);

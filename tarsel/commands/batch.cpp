@@ -30,16 +30,24 @@ std::string tasksText(size_t count) { return std::to_string(count) + (count == 1
 
 // --- Changes
 
-// The indexes of the tasks that words name, each once, in the order of the list; "all" names all.
-std::vector<size_t> indexesOf(const BatchFile& file, const Words& words) {
-    const Tasks tasks = file.tasks();
+BatchTask taskAt(const BatchFile& file, const QvBatchList& list, size_t index) {
+    const Any& stored = static_cast<const AnyVector&>(list).at(static_cast<int>(index));
+    return batchTask(stored.asDict(), static_cast<int>(index) + 1, file.folder());
+}
+
+// The indexes of the tasks that words name, each once, in the order of the list; "all" names all. The names
+// of tasks cost a digest each, so they are made only where one is given.
+std::vector<size_t> indexesOf(const BatchFile& file, const QvBatchList& list, const Words& words) {
+    const auto size = static_cast<size_t>(list.size());
+    Tasks tasks(size);
+    const bool named = std::any_of(words.begin(), words.end(), [](const std::string& word) {
+        return word != "all" && !isTaskNumber(word);
+    });
+    for (size_t i = 0; named && i < size; ++i) tasks[i].id = taskAt(file, list, i).id;
     std::set<size_t> found;
     for (const std::string& word : words) {
-        if (word != "all") {
-            found.insert(findTask(tasks, word, file));
-            continue;
-        }
-        for (size_t i = 0; i < tasks.size(); ++i) found.insert(i);
+        if (word != "all") found.insert(findTask(tasks, word, file));
+        for (size_t i = 0; word == "all" && i < size; ++i) found.insert(i);
     }
     return {found.begin(), found.end()};
 }
@@ -47,7 +55,7 @@ std::vector<size_t> indexesOf(const BatchFile& file, const Words& words) {
 void enable(const BatchFile& file, const Words& words, bool on) {
     size_t count = 0;
     file.change([&](QvBatchList& list) {
-        for (const size_t i : indexesOf(file, words)) {
+        for (const size_t i : indexesOf(file, list, words)) {
             count += list.isTaskEnabled(static_cast<int>(i)) == on ? 0 : 1;
             list.setTaskEnabled(static_cast<int>(i), on);
         }
@@ -57,9 +65,8 @@ void enable(const BatchFile& file, const Words& words, bool on) {
 
 void move(const BatchFile& file, const std::string& task, const std::string& place) {
     file.change([&](QvBatchList& list) {
-        const int from = static_cast<int>(indexesOf(file, {task}).front());
-        const bool number = place.size() < 8 && place.find_first_not_of("0123456789") == std::string::npos;
-        const int to = number ? std::stoi(place) - 1 : -1;
+        const int from = static_cast<int>(indexesOf(file, list, {task}).front());
+        const int to = isTaskNumber(place) ? std::stoi(place) - 1 : -1;
         if (to < 0 || to >= list.size())
             throw failure(Msg::batchPlace, {place, tasksText(static_cast<size_t>(list.size()))});
         const int step = to < from ? -1 : 1;
@@ -70,14 +77,13 @@ void move(const BatchFile& file, const std::string& task, const std::string& pla
 void removeTasks(const BatchFile& file, const Words& words) {
     size_t count = 0;
     file.change([&](QvBatchList& list) {
-        const Tasks tasks = file.tasks();
-        const std::vector<size_t> indexes = indexesOf(file, words);
+        const std::vector<size_t> indexes = indexesOf(file, list, words);
         count = indexes.size();
         for (auto i = indexes.rbegin(); i != indexes.rend(); ++i) {
+            const std::string name = file.journal(taskAt(file, list, *i).id);
             list.remove(static_cast<int>(*i));
             // What was done with a task is of no use without it.
-            if (const std::string name = file.journal(tasks[*i].id); !RecordFile::isLocked(name))
-                removeFile(name);
+            if (!RecordFile::isLocked(name)) removeFile(name);
         }
     });
     tell(Level::note, tasksText(count) + " removed");
