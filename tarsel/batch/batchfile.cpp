@@ -5,6 +5,7 @@
 #include <filesystem>
 #include <new>
 
+#include "tarsel/host/childprocess.h"
 #include "tarsel/host/files.h"
 #include "tarsel/host/memory.h"
 #include "tarsel/host/outputs/sharedfile.h"
@@ -38,8 +39,29 @@ QvBatchList BatchFile::load() const {
                                                      : "it holds no list of tasks"});
 }
 
-std::vector<BatchTask> BatchFile::tasks() const {
-    QvBatchList list = load();
+Descriptor BatchFile::handOver(const QvBatchList& list, size_t index) {
+    Descriptor file = fileInMemory();
+    const std::string name = nameOfDescriptor(file.get());
+    AnyVector one;
+    one.append(static_cast<const AnyVector&>(list).at(static_cast<int>(index)));
+    errno = 0;
+    try {
+        if (XmlParser::storeDict(Any(name.c_str()), AnyDict("taskList", one), "BatchList", "2.0") ==
+            QvStatus::ok)
+            return file;
+    } catch (const QvFileException&) {
+    }
+    throw systemFailure(Msg::batchNotWritten, "memory", errno != 0 ? errno : EIO);
+}
+
+BatchTask BatchFile::handedTask(int descriptor, int number) const {
+    QvBatchList list;
+    if (list.load(Any(nameOfDescriptor(descriptor).c_str())) != QvStatus::ok || list.size() != 1)
+        throw failure(Msg::batchUnreadable, {shown_, "no task was handed over"});
+    return batchTask(list.at(0), number, folder());
+}
+
+std::vector<BatchTask> BatchFile::tasksOf(const QvBatchList& list) const {
     std::vector<BatchTask> tasks;
     tasks.reserve(static_cast<size_t>(list.size()));
     for (const Any& stored : list) {

@@ -10,6 +10,7 @@
 #include <vector>
 
 #include "tarsel/batch/batchtask.h"
+#include "tarsel/host/descriptor.h"
 
 class BatchFile {
   public:
@@ -25,7 +26,12 @@ class BatchFile {
     // Throws Failure (input) for a file that can't be read or is no list.
     QvBatchList load() const;
     // Its tasks, without their states.
-    std::vector<BatchTask> tasks() const;
+    std::vector<BatchTask> tasks() const { return tasksOf(load()); }
+    std::vector<BatchTask> tasksOf(const QvBatchList& list) const;
+    // One task of the list as a document of its own, for a process that need not read the whole list; and
+    // that task there. Both throw Failure.
+    static Descriptor handOver(const QvBatchList& list, size_t index);
+    BatchTask handedTask(int descriptor, int number) const;
     // Makes an empty list. Throws Failure (output) if the file exists, unless `overwrite`.
     void make(bool overwrite) const;
     // Loads the list, changes it and puts it in the place of the old one, while no other run can. The file

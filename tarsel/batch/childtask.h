@@ -11,8 +11,10 @@
 class ChildTask {
   public:
     // `words`: a command of the tool that sends objects (see docs/progress.schema.json) to its standard
-    // error. Throws Failure.
-    explicit ChildTask(const std::vector<std::string>& words) : process_(words) { time_.start(); }
+    // error. `task`: see handedTask. Throws Failure.
+    ChildTask(const std::vector<std::string>& words, const Descriptor& task) : process_(words, task) {
+        time_.start();
+    }
 
     ChildProcess& process() { return process_; }
     const ChildProcess& process() const { return process_; }

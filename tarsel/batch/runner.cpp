@@ -31,7 +31,8 @@ BatchRunner::BatchRunner(const BatchFile& file, const BatchOptions& options, Sig
     : file_(file), options_(options), signals_(signals), progress_(options.progress, options.quiet, "") {}
 
 void BatchRunner::prepare() {
-    std::vector<BatchTask> tasks = file_.tasks();
+    list_ = file_.load();
+    std::vector<BatchTask> tasks = file_.tasksOf(list_);
     if (tasks.empty()) throw failure(Msg::batchEmpty, {file_.shown()});
     order_ = orderOf(tasks);
     entries_.resize(tasks.size());
@@ -129,13 +130,14 @@ void BatchRunner::start(Entry& entry) {
 
 void BatchRunner::startChild(Entry& entry) {
     std::vector<std::string> words = options_.command;
-    words.push_back(entry.task.id);
+    words.push_back(std::to_string(entry.task.number));
     ++entry.result.attempts;
     entry.result.start = secondsSince1970();
     entry.timedOut = entry.killed = false;
     try {
+        const Descriptor task = BatchFile::handOver(list_, static_cast<size_t>(entry.task.number) - 1);
         const std::lock_guard guard(lock_);
-        entry.child = std::make_unique<ChildTask>(words);
+        entry.child = std::make_unique<ChildTask>(words, task);
         // A pause is one within the task, wherever it came.
         if (paused_) {
             entry.child->time().pause();

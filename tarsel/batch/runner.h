@@ -25,7 +25,7 @@ struct BatchOptions {
     bool quiet = false;
     ProgressMode progress;
     OutputPolicy policy{false};
-    // The command line of a task's process, to which its name is added.
+    // The command line of a task's process, to which its number is added.
     std::vector<std::string> command;
 };
 
@@ -68,6 +68,7 @@ class BatchRunner {
     const BatchFile& file_;
     const BatchOptions& options_;
     Signals& signals_;
+    QvBatchList list_;
     std::vector<Entry> entries_;
     std::vector<std::vector<Before>> order_;
     Progress progress_;

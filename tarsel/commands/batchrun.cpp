@@ -1,5 +1,6 @@
 // tarsel batch LIST run: all tasks that are left, or some of them in this process.
 #include <algorithm>
+#include <climits>
 #include <thread>
 
 #include "tarsel/batch/runner.h"
@@ -24,7 +25,7 @@ constexpr int kMostRetries = 100;
 struct Given {
     OutputOptions outputs;
     ProgressOption progress;
-    std::string jobs, retries, timeout, threads;
+    std::string jobs, retries, timeout, threads, handed;
     Words tasks;
     bool stopOnError = false, verify = false, quiet = false;
     bool allowPost = false, acceptPartial = false, strict = false;
@@ -43,14 +44,16 @@ void runTasks(const Given& given, const BatchFile& file, Signals& signals) {
     how.allowPost = given.allowPost;
     how.verify = given.verify;
     how.plan = planWords;
-    const std::vector<BatchTask> tasks = file.tasks();
+    if (!given.handed.empty()) {
+        const auto number = static_cast<int>(parseNumber(given.handed, 1, INT_MAX, "--handed"));
+        return how.run(file, file.handedTask(ChildProcess::kHanded, number), signals);
+    }
+    QvBatchList list = file.load();
+    const std::vector<BatchTask> tasks = file.tasksOf(list);
     std::vector<size_t> wanted;
     for (const std::string& word : given.tasks) wanted.push_back(findTask(tasks, word, file));
-    QvBatchList list = file.load();
     for (const size_t i : wanted) {
         const int index = static_cast<int>(i);
-        // The list may have changed between the two.
-        if (index >= list.size()) throw failure(Msg::batchNoTask, {file.shown(), tasks[i].id, "changed"});
         how.run(file, batchTask(list.at(index), index + 1, file.folder()), signals);
     }
 }
@@ -88,7 +91,7 @@ Words commandOf(const Given& given, const BatchFile& file, const Words& before, 
         words.insert(words.end(), {"--threads", given.threads});
     else if (jobs > 1)
         words.insert(words.end(), {"--threads", std::to_string(threads)});
-    words.emplace_back("--task");
+    words.emplace_back("--handed");
     return words;
 }
 
@@ -135,6 +138,7 @@ void addBatchRun(Command& batch, Signals& signals, const ListName& list, const s
     command.flag("--stop-on-error", given->stopOnError, "Begin no task after one has failed");
     command.flag("--verify", given->verify, "Know what was done by the bytes of the outputs as well");
     command.list("--task", given->tasks, "Run only this task, in this process", "TASK");
+    command.option("--handed", given->handed, "Of the processes of a run: the task is in descriptor 3", "N");
     given->progress.add(command);
     command.flag("--allow-post", given->allowPost, "Run the commands that tasks have for afterwards");
     command.flag("--accept-partial", given->acceptPartial, "Take what is there of damaged inputs");
@@ -145,7 +149,7 @@ void addBatchRun(Command& batch, Signals& signals, const ListName& list, const s
     command.action(
         [&signals, list, given, before] {
             const BatchFile file(*list);
-            if (given->tasks.empty()) return runAll(*given, file, before(), signals);
+            if (given->tasks.empty() && given->handed.empty()) return runAll(*given, file, before(), signals);
             for (const auto& [value, name] : {std::pair{&given->jobs, "--jobs"},
                                               {&given->retries, "--retry"},
                                               {&given->timeout, "--timeout"}})

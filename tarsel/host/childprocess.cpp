@@ -7,6 +7,7 @@
 #include <fcntl.h>
 #include <poll.h>
 #include <sys/eventfd.h>
+#include <sys/mman.h>
 #include <sys/prctl.h>
 #include <sys/syscall.h>
 #include <sys/wait.h>
@@ -16,7 +17,7 @@
 namespace {
 
 // Between fork and exec nothing but calls that need no lock and no memory.
-[[noreturn]] void becomeProgram(char* const* words, int output, int nowhere, pid_t parent) {
+[[noreturn]] void becomeProgram(char* const* words, int output, int nowhere, int handed, pid_t parent) {
     prctl(PR_SET_PDEATHSIG, SIGKILL);
     if (getppid() != parent) _exit(127);  // it has ended before that was set
     setpgid(0, 0);
@@ -26,13 +27,16 @@ namespace {
     pthread_sigmask(SIG_SETMASK, &none, nullptr);
     if (dup2(nowhere, STDIN_FILENO) < 0 || dup2(output, STDOUT_FILENO) < 0 || dup2(output, STDERR_FILENO) < 0)
         _exit(127);
+    if (handed == ChildProcess::kHanded ? fcntl(handed, F_SETFD, 0) != 0
+                                        : dup2(handed, ChildProcess::kHanded) < 0)
+        _exit(127);
     execv(words[0], words);
     _exit(127);
 }
 
 }  // namespace
 
-ChildProcess::ChildProcess(const std::vector<std::string>& words) {
+ChildProcess::ChildProcess(const std::vector<std::string>& words, const Descriptor& handed) {
     std::vector<char*> arguments;
     for (const std::string& word : words) arguments.push_back(const_cast<char*>(word.c_str()));
     arguments.push_back(nullptr);
@@ -43,7 +47,7 @@ ChildProcess::ChildProcess(const std::vector<std::string>& words) {
     const Descriptor writing(ends[1]);
     const pid_t self = getpid();
     pid_ = fork();
-    if (pid_ == 0) becomeProgram(arguments.data(), writing.get(), nowhere.get(), self);
+    if (pid_ == 0) becomeProgram(arguments.data(), writing.get(), nowhere.get(), handed.get(), self);
     if (pid_ < 0) throw systemFailure(Msg::childNotStarted, words[0], errno);
     setpgid(pid_, pid_);  // whichever of both is first
     handle_.reset(static_cast<int>(syscall(SYS_pidfd_open, pid_, 0)));
@@ -113,6 +117,14 @@ void waitForAny(std::span<const int> descriptors, int milliseconds) {
     for (const int one : descriptors) all.push_back({one, POLLIN, 0});
     poll(all.data(), all.size(), milliseconds);
 }
+
+Descriptor fileInMemory() {
+    Descriptor file(memfd_create("tarsel", MFD_CLOEXEC));
+    if (!file) throw systemFailure(Msg::childNotStarted, "memfd", errno);
+    return file;
+}
+
+std::string nameOfDescriptor(int descriptor) { return "/proc/self/fd/" + std::to_string(descriptor); }
 
 std::string ownProgram() {
     char name[PATH_MAX];

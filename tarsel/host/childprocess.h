@@ -15,8 +15,11 @@
 // live as long as it.
 class ChildProcess {
   public:
-    // words[0] is the file to run. Throws Failure if there is no room for another process.
-    explicit ChildProcess(const std::vector<std::string>& words);
+    static constexpr int kHanded = 3;
+
+    // words[0] is the file to run. `handed` becomes its descriptor kHanded. Throws Failure if there is no
+    // room for another process.
+    ChildProcess(const std::vector<std::string>& words, const Descriptor& handed);
     // Kills it if it has not ended.
     ~ChildProcess();
     ChildProcess(const ChildProcess&) = delete;
@@ -58,6 +61,11 @@ class Bell {
 
 // Until one of them can be read, or so many milliseconds have passed; negative: without an end.
 void waitForAny(std::span<const int> descriptors, int milliseconds);
+
+// A file without a name that is gone when its last descriptor is closed. Throws Failure.
+Descriptor fileInMemory();
+// By which it can be opened.
+std::string nameOfDescriptor(int descriptor);
 
 // The program that is running, as a file.
 std::string ownProgram();
