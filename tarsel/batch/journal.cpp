@@ -135,7 +135,8 @@ void TaskJournal::started() {
                          {"key", key_},
                          {"time", secondsSince1970()},
                          {"host", self.host},
-                         {"pid", self.pid}}));
+                         {"pid", self.pid}}),
+                 false);
 }
 
 void TaskJournal::placing(const std::vector<PlacedFile>& files) {
@@ -145,20 +146,22 @@ void TaskJournal::placing(const std::vector<PlacedFile>& files) {
         if (!stamp) throw failure(Msg::outputFolderGone, {file.name});
         placed_.push_back({file.name, *stamp, digestOfFile(file.written)});
     }
-    file_.append(lineOf({{"event", "placing"}, {"key", key_}, {"files", rowsOf(placed_)}}));
+    file_.append(lineOf({{"event", "placing"}, {"key", key_}, {"files", rowsOf(placed_)}}), true);
 }
 
 void TaskJournal::done() {
     file_.append(lineOf({{"event", "done"},
                          {"key", key_},
                          {"seconds", QvTimer::absoluteTime() - start_},
-                         {"files", rowsOf(placed_)}}));
+                         {"files", rowsOf(placed_)}}),
+                 false);
 }
 
 void TaskJournal::failed(int status, const std::string& error) {
-    file_.append(lineOf({{"event", "failed"}, {"key", key_}, {"status", status}, {"error", error}}));
+    file_.append(lineOf({{"event", "failed"}, {"key", key_}, {"status", status}, {"error", error}}), false);
 }
 
 void TaskJournal::settled(const std::vector<RecordedFile>& files) {
-    file_.append(lineOf({{"event", "done"}, {"key", key_}, {"seconds", 0.0}, {"files", rowsOf(files)}}));
+    file_.append(lineOf({{"event", "done"}, {"key", key_}, {"seconds", 0.0}, {"files", rowsOf(files)}}),
+                 false);
 }

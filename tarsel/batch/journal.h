@@ -6,6 +6,7 @@
 //     {"event":"failed", "key":..., "status":..., "error":...}
 //
 // "placing" is on the disk before the first file gets its name, "done" is written after the last one has it.
+// Other lines may be lost when the power fails: then the task is done again, or its files tell.
 // After an end between the two, the files say whether the task was done.
 #pragma once
 

@@ -91,20 +91,20 @@ void RecordFile::lock() {
     if (const int error = flockFor(file_.get(), LOCK_EX)) refuse(name_, error);
 }
 
-void RecordFile::append(std::string_view text) {
+void RecordFile::append(std::string_view text, bool sync) {
     struct stat status;
     if (fstat(file_.get(), &status) != 0) refuse(name_, errno);
     char last = '\n';
-    const bool fresh = status.st_size == 0;
-    if (!fresh && pread(file_.get(), &last, 1, status.st_size - 1) != 1) refuse(name_, errno);
+    if (status.st_size > 0 && pread(file_.get(), &last, 1, status.st_size - 1) != 1) refuse(name_, errno);
     std::string line = last == '\n' ? "" : "\n";  // after one that was cut
     line += checksum(text) + " " + std::string(text) + "\n";
-    errno = 0;
-    if (!writeAll(file_.get(), line) || (fdatasync(file_.get()) != 0 && errno != EINVAL))
-        refuse(name_, errno);
-    if (!fresh) return;
+    if (!writeAll(file_.get(), line)) refuse(name_, errno);
+    if (!sync) return;
+    if (fdatasync(file_.get()) != 0 && errno != EINVAL) refuse(name_, errno);
+    if (entered_) return;
     const Descriptor folder(openFolder(fs::path(name_).parent_path().c_str()));
     if (const int error = folder ? syncFolder(folder.get()) : errno) refuse(name_, error);
+    entered_ = true;
 }
 
 bool RecordFile::isLocked(const std::string& name) {

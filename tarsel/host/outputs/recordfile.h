@@ -19,8 +19,8 @@ class RecordFile {
     // until that one has ended.
     bool tryLock();
     void lock();
-    // The line is on the disk when this returns. Throws Failure (output).
-    void append(std::string_view text);
+    // With `sync` the line, and all before it, is on the disk when this returns. Throws Failure (output).
+    void append(std::string_view text, bool sync);
 
     // Whether another process has the lock of a file.
     static bool isLocked(const std::string& name);
@@ -30,6 +30,7 @@ class RecordFile {
   private:
     std::string name_;
     Descriptor file_;
+    bool entered_ = false;  // its name is on the disk
 };
 
 // A lock that names the process that has it.
