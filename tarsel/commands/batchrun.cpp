@@ -123,7 +123,8 @@ void runAll(const Given& given, const BatchFile& file, const Words& before, Sign
         throw Failure(status, lineOf(Msg::batchStopped, {std::to_string(done), all, file.shown()}));
     if (failed > 0) throw failure(Msg::batchTasksFailed, {file.shown(), std::to_string(failed), all});
     if (!given.quiet)
-        tell(Level::note, "all " + all + " tasks are done, in " + formatTime(result.seconds).substr(0, 7));
+        tell(Level::note, (all == "1" ? "1 task is" : "all " + all + " tasks are") + " done, in " +
+                              formatTime(result.seconds).substr(0, 7));
 }
 
 }  // namespace
