@@ -318,7 +318,7 @@ constexpr Message kMessages[] = {
     {Msg::batchRuns,           Exit::failed, "can't run {file}",                      "process {text} on {text} runs it",                          "wait for it, or stop that one"},
     {Msg::batchUnreadable,     Exit::input,  "{file} is no list of tasks",            "{system}",                                                  "check the name, or make a list with 'tarsel batch LIST new'"},
     {Msg::batchExists,         Exit::output, "can't make {file}",                     "it exists",                                                 "give -y to empty it, or another name"},
-    {Msg::batchNotWritten,     Exit::output, "can't write {file}",                    "{text}",                                                    "{text}"},
+    {Msg::batchNotWritten,     Exit::output, "can't write the list {file}",           "{text}",                                                    "{text}"},
     {Msg::batchNoTask,         Exit::usage,  "{file} has no task {name}",             "it has {text}",                                             "'tarsel batch LIST list' shows their numbers and names"},
     {Msg::batchIdShort,        Exit::usage,  "{file} has no task {name}",             "a name of a task has at least 8 digits",                    "'tarsel batch LIST list' shows all"},
     {Msg::batchIdOpen,         Exit::usage,  "{name} is not one task",                "several tasks of {file} begin so",                          "give more digits"},
