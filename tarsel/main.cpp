@@ -99,6 +99,12 @@ int run(int argc, char** argv) {
     addTranscode(line, signals, version);
     addRun(line, signals, version);
     addTask(line, signals);
+    addBatch(line, signals, version, {argv, argv + argc}, [&] {
+        std::vector<std::string> before;
+        if (!plugins.empty()) before.insert(before.end(), {"--plugins", plugins});
+        if (allowUnsafePlugins) before.emplace_back("--allow-unsafe-plugins");
+        return before;
+    });
     addInfo(line);
     addLoudness(line);
     addMix(line, signals);

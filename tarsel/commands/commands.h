@@ -1,7 +1,9 @@
 // The sub-commands. Each adds itself to the command line and says what runs when it is chosen.
 #pragma once
 
+#include <functional>
 #include <string>
+#include <vector>
 
 class CommandLine;
 class Signals;
@@ -17,6 +19,10 @@ void addFormats(CommandLine& line);
 void addPresets(CommandLine& line, Signals& signals);
 void addRecover(CommandLine& line);
 void addRun(CommandLine& line, Signals& signals, const std::string& version);
+// `words`: the whole command line; `before` gives those of it that stand before the command, for other runs
+// of the tool.
+void addBatch(CommandLine& line, Signals& signals, const std::string& version,
+              const std::vector<std::string>& words, std::function<std::vector<std::string>()> before);
 void addTask(CommandLine& line, Signals& signals);
 void addCompare(CommandLine& line, Signals& signals);
 void addScope(CommandLine& line, Signals& signals);

@@ -2,15 +2,10 @@
 #include "tarsel/commands/commands.h"
 #include "tarsel/commands/outputoptions.h"
 #include "tarsel/commands/progressoption.h"
-#include "tarsel/host/console.h"
-#include "tarsel/host/events.h"
-#include "tarsel/host/outputs/streamoutput.h"
 #include "tarsel/host/signals.h"
 #include "tarsel/job/job.h"
-#include "tarsel/job/task/taskfilters.h"
-#include "tarsel/job/task/taskplan.h"
+#include "tarsel/job/storedjob.h"
 #include "tarsel/words/commandline.h"
-#include "tarsel/words/messages.h"
 
 namespace {
 
@@ -23,34 +18,6 @@ struct Given {
     bool allowPost = false;
 };
 
-bool isNullDevice(const std::string& output) {
-    const auto stream = output.empty() ? nullptr : StreamOutput::find(output, {});
-    return stream && stream->discards();
-}
-
-// What the command line says for a job, the task says here.
-std::unique_ptr<StoredTask> openTask(const Given& given, JobOptions& job) {
-    auto task = std::make_unique<StoredTask>(given.task);
-    job.output = given.output.empty() ? task->output() : given.output;
-    checkTaskFilters(*task, job.acceptPartial);
-    // A multiplexer that goes back to its header can't write there.
-    if (isNullDevice(job.output)) task->discardOutput();
-    task->open();
-    const QvMuxer* const muxer = task->task().encoder()->getMuxer();
-    job.kind = taskOutputKind(*task);
-    job.muxer = muxer ? muxer->name() : "nullmux";
-    job.inputs = task->inputs();
-    job.splitChannels = job.muxer == "rawmux" && muxer->QvCodec::getParam("splitAudio").isTrue();
-    return task;
-}
-
-std::string commandOf(const Given& given, const StoredTask& task) {
-    const std::string command = task.postProcess();
-    if (command.empty() || given.allowPost) return command;
-    tell(Level::warning, lineOf(Msg::taskPostLeft, {given.task, command}));
-    return "";
-}
-
 void run(Given& given, Signals& signals) {
     limitThreads(given.threads);
     given.job.policy = given.outputs.policy();
@@ -58,10 +25,9 @@ void run(Given& given, Signals& signals) {
     given.job.policy.quiet = given.job.quiet;
     runJob(given.job, [&] {
         JobOptions job = given.job;
-        auto task = openTask(given, job);
-        job.post = commandOf(given, *task);
-        for (const std::string& log : task->qualityLogs())
-            job.warnings.push_back(lineOf(Msg::taskLogLeft, {given.task, log}));
+        job.output = given.output;
+        auto task = std::make_unique<StoredTask>(given.task);
+        openStoredJob(*task, job, given.allowPost);
         return std::make_unique<Job>(job, std::move(task), signals);
     });
 }

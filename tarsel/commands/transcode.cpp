@@ -3,6 +3,7 @@
 #include "tarsel/commands/commands.h"
 #include "tarsel/commands/outputoptions.h"
 #include "tarsel/commands/progressoption.h"
+#include "tarsel/commands/transcode.h"
 #include "tarsel/host/signals.h"
 #include "tarsel/job/job.h"
 #include "tarsel/job/plan/outputform.h"
@@ -13,12 +14,10 @@
 
 namespace {
 
-// Options as they were given; they are parsed once the command runs.
-struct Given {
-    JobOptions job;
+struct Given : GivenJob {
     OutputOptions outputs;
     ProgressOption progress;
-    std::string samplerate, channels, bits, threads, inputFormat;
+    std::string threads, inputFormat;
 };
 
 int parseBits(const std::string& text) {
@@ -54,26 +53,25 @@ void takeStandardInput(Given& given) {
     if (job.standardInput && !job.saveTask.empty()) throw failure(Msg::stdinRefuses, {"--save-task"});
 }
 
-void resolve(Given& given) {
+}  // namespace
+
+void resolveJob(GivenJob& given) {
     JobOptions& job = given.job;
     job.effects.check();
     job.sound.check();
     if (job.shortest && job.longest) throw failure(Msg::optionsExclude, {"--shortest", "--longest"});
-    limitThreads(given.threads);
     if (!job.to.empty() && !job.duration.empty()) throw failure(Msg::optionsExclude, {"--to", "--duration"});
-    job.policy = given.outputs.policy();
-    job.policy.recover = !job.dryRun;
-    job.policy.quiet = job.quiet;
     job.effects.acceptPartial = job.acceptPartial;
     if (!given.samplerate.empty())
         job.samplerate = static_cast<int>(parseNumber(given.samplerate, 1000, 768000, "--samplerate"));
     if (!given.channels.empty())
         job.channels = static_cast<int>(parseNumber(given.channels, 1, 8, "--channels"));
     if (!given.bits.empty()) job.bits = parseBits(given.bits);
-    takeStandardInput(given);
     choosePreset(job);
     checkMuxer(job);
 }
+
+namespace {
 
 void openEvents(Given& given, const std::string& version) {
     JobOptions& job = given.job;
@@ -86,7 +84,13 @@ void openEvents(Given& given, const std::string& version) {
 }
 
 void transcode(Given& given, Signals& signals) {
-    resolve(given);
+    JobOptions& job = given.job;
+    limitThreads(given.threads);
+    job.policy = given.outputs.policy();
+    job.policy.recover = !job.dryRun;
+    job.policy.quiet = job.quiet;
+    takeStandardInput(given);
+    resolveJob(given);
     runJob(given.job, [&] { return std::make_unique<Job>(given.job, signals); });
 }
 
@@ -98,14 +102,11 @@ std::vector<std::string> outputFormats() {
 
 }  // namespace
 
-void addTranscode(CommandLine& line, Signals& signals, const std::string& version) {
-    Command command = line.command("transcode", "Read INPUTs, convert, and write OUTPUT");
-    auto given = std::make_shared<Given>();
-    JobOptions& job = given->job;
+void addJobOptions(Command& command, GivenJob& given, Need inputs) {
+    JobOptions& job = given.job;
     command.arguments("INPUT", job.inputs,
-                      "Files, testgen:size=1280x720,rate=25,duration=10, or - for the standard input");
-    command.option("--input-format", given->inputFormat,
-                   "What the standard input holds, as an extension: wav, ...", "EXT");
+                      "Files, testgen:size=1280x720,rate=25,duration=10, or - for the standard input", 0,
+                      inputs);
     command.option("-o,--output", job.output,
                    "What to write; the extension says how. - is the standard output", "FILE");
     command.option("--format", job.format, "What to write, in the place of an extension: wav, raw, ...",
@@ -123,9 +124,9 @@ void addTranscode(CommandLine& line, Signals& signals, const std::string& versio
     command.option("--duration", job.duration, "How much is taken, in the place of --to", "TIME");
     command.flag("--no-video", job.noVideo, "Leave out the pictures");
     command.flag("--no-audio", job.noAudio, "Leave out the sound");
-    command.option("--samplerate", given->samplerate, "Samples a second", "N");
-    command.option("--channels", given->channels, "Channels of the sound, 1 to 8", "N");
-    command.option("--bits", given->bits, "Bits of a sample: 8, 16 or 24", "N");
+    command.option("--samplerate", given.samplerate, "Samples a second", "N");
+    command.option("--channels", given.channels, "Channels of the sound, 1 to 8", "N");
+    command.option("--bits", given.bits, "Bits of a sample: 8, 16 or 24", "N");
     command.flag("--shortest", job.shortest, "End the picture with its sound");
     command.flag("--longest", job.longest, "Hold the last picture until the sound has ended");
     command.option("--muxer", job.muxer, "nullmux: do everything but write; or one that the preset allows",
@@ -133,18 +134,28 @@ void addTranscode(CommandLine& line, Signals& signals, const std::string& versio
     command.option("--post", job.post,
                    "A command run afterwards; %i and %o stand for the inputs and outputs, %o1 for the first",
                    "CMD");
+    command.flag("--split-channels", job.splitChannels, "One WAV file a channel");
+    command.flag("--accept-partial", job.acceptPartial, "Take what is there of a damaged input");
+    addSoundOptions(command, job.sound);
+    addEffectOptions(command, job.effects);
+}
+
+void addTranscode(CommandLine& line, Signals& signals, const std::string& version) {
+    Command command = line.command("transcode", "Read INPUTs, convert, and write OUTPUT");
+    auto given = std::make_shared<Given>();
+    JobOptions& job = given->job;
+    addJobOptions(command, *given, Need::required);
+    command.group("");
+    command.option("--input-format", given->inputFormat,
+                   "What the standard input holds, as an extension: wav, ...", "EXT");
     command.option("--save-task", job.saveTask, "Write the job as a task file", "FILE");
     command.flag("--relative", job.relative, "The task file names files as seen from its folder");
     given->progress.add(command);
-    command.flag("--split-channels", job.splitChannels, "One WAV file a channel");
-    command.flag("--accept-partial", job.acceptPartial, "Take what is there of a damaged input");
     command.flag("--strict", job.strict, "Let the job fail if there is a warning");
     addThreads(command, given->threads);
     command.flag("--dry-run", job.dryRun, "Print the plan and do nothing");
     given->outputs.add(command);
     command.flag("-q,--quiet", job.quiet, "Say nothing but errors");
-    addSoundOptions(command, job.sound);
-    addEffectOptions(command, job.effects);
     command.action([&signals, given] { transcode(*given, signals); },
                    [given, version] { openEvents(*given, version); });
 }

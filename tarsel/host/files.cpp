@@ -4,6 +4,9 @@
 #include <cerrno>
 #include <cstdio>
 #include <filesystem>
+#include <new>
+
+#include <glob.h>
 
 #include "tarsel/words/messages.h"
 #include "tarsel/words/systemcause.h"
@@ -141,4 +144,42 @@ int writeFile(const std::string& name, const std::string& text) {
     const int error = errno;
     if (std::fclose(file) != 0 && taken) return errno;
     return taken ? 0 : error;
+}
+
+std::string resolvedName(const std::string& name) {
+    std::error_code error;
+    const fs::path resolved = fs::weakly_canonical(absoluteName(name), error);
+    return error ? absoluteName(name) : resolved.string();
+}
+
+std::vector<std::string> filesMatching(const std::string& pattern) {
+    glob_t found{};
+    std::vector<std::string> names;
+    const int result = glob(pattern.c_str(), 0, nullptr, &found);
+    for (size_t i = 0; result == 0 && i < found.gl_pathc; ++i)
+        if (isRegularFile(found.gl_pathv[i])) names.emplace_back(found.gl_pathv[i]);
+    globfree(&found);
+    if (result == GLOB_NOSPACE) throw std::bad_alloc();
+    return names;
+}
+
+void enterFolder(const std::string& name) {
+    std::error_code error;
+    fs::current_path(name, error);
+    if (error) throw systemFailure(Msg::inputSystem, name, error.value());
+}
+
+std::string workingFolder() {
+    std::error_code error;
+    return fs::current_path(error).string();
+}
+
+void requireFolder(const std::string& folder, const std::string& output) {
+    std::error_code error;
+    if (!fs::is_directory(folder, error)) throw failure(Msg::outputFolderAbsent, {output, folder});
+}
+
+void removeFile(const std::string& name) {
+    std::error_code error;
+    fs::remove(name, error);
 }

@@ -44,3 +44,14 @@ bool samePlace(const std::string& first, const std::string& second);
 // Makes the file, or empties it, and writes `text`. 0 or an errno.
 int writeFile(const std::string& name, const std::string& text);
 long long fileBytes(const std::string& name);  // -1 if there is no such file
+// The same with all symbolic links followed, as far as there is something.
+std::string resolvedName(const std::string& name);
+// Regular files whose names match a pattern of a shell ("in/*.wav"), sorted.
+std::vector<std::string> filesMatching(const std::string& pattern);
+// Makes it the working folder. Throws Failure (input).
+void enterFolder(const std::string& name);
+std::string workingFolder();
+// Throws Failure (output) if the folder that is to get `output` is not there.
+void requireFolder(const std::string& folder, const std::string& output);
+// Nothing if it is not there.
+void removeFile(const std::string& name);

@@ -262,21 +262,25 @@ void Job::printPlan() {
         for (const auto& line : parts_.plan.notes) tell(Level::note, line);
 }
 
+std::unique_ptr<Job> readyJob(JobOptions& options, const std::function<std::unique_ptr<Job>()>& make) {
+    options.sound.gains.clear();
+    std::unique_ptr<Job> job = make();
+    job->checkWarnings();
+    if (!job->needsGains() || (options.dryRun && options.saveTask.empty())) return job;
+    const auto [gains, seconds] = job->measureGains();
+    options.sound.gains = gains;
+    options.measuredFor = seconds;
+    job.reset();  // which has the names of the outputs
+    job = make();
+    job->checkWarnings();
+    return job;
+}
+
 void runJob(JobOptions& options, const std::function<std::unique_ptr<Job>()>& make) {
     // Of an input that becomes shorter each time that it is read.
     constexpr int mostAttempts = 3;
     for (int attempt = 1;; ++attempt) {
-        options.sound.gains.clear();
-        std::unique_ptr<Job> job = make();
-        job->checkWarnings();
-        if (job->needsGains() && (!options.dryRun || !options.saveTask.empty())) {
-            const auto [gains, seconds] = job->measureGains();
-            options.sound.gains = gains;
-            options.measuredFor = seconds;
-            job.reset();  // which has the names of the outputs
-            job = make();
-            job->checkWarnings();
-        }
+        const std::unique_ptr<Job> job = readyJob(options, make);
         if (options.dryRun) return job->printPlan();
         try {
             return job->run();
@@ -287,5 +291,7 @@ void runJob(JobOptions& options, const std::function<std::unique_ptr<Job>()>& ma
         }
     }
 }
+
+AnyDict Job::stored() { return storedState(parts_, options_); }
 
 void Job::run() { JobRun(options_, parts_, lengths_, warnings_, signals_).run(); }

@@ -27,6 +27,10 @@ class Job {
     // The gains, and how many seconds they took. Shows progress as a first pass. Throws Failure, also when it
     // was stopped.
     std::pair<std::vector<double>, double> measureGains();
+    // The job as a task; see storedState.
+    AnyDict stored();
+    // The names that it writes to, in a form by which places can be compared.
+    std::vector<std::string> places() const { return parts_.outputs.places(); }
     // Writes the task file if there is to be one, and prints the plan to the standard output.
     void printPlan();
     // Carries the plan out; see JobRun::run. Throws InputShrank for a job that can be run again.
@@ -54,6 +58,9 @@ class Job {
     std::unique_ptr<JoinLevel> level_;
 };
 
+// Makes the job, complete but for its run: with the gains of its sounds, which are measured if it needs them.
+// Throws Failure.
+std::unique_ptr<Job> readyJob(JobOptions& options, const std::function<std::unique_ptr<Job>()>& make);
 // Makes the job, and prints or runs it; once more where an input has become shorter meanwhile and the options
 // take what is there. Throws Failure.
 void runJob(JobOptions& options, const std::function<std::unique_ptr<Job>()>& make);

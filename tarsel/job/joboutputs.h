@@ -24,6 +24,8 @@ class JobOutputs {
     // Throws Failure.
     void claim(const JobPlan& plan, const std::vector<std::string>& inputs, QvEncodePipe& pipe);
 
+    // After claim: of all files that the job writes, in a form by which places can be compared.
+    std::vector<std::string> places() const { return {places_.begin(), places_.end()}; }
     // Null where the output is a stream or nothing.
     const Outputs* files() const { return files_.get(); }
     const StreamOutput* stream() const { return stream_.get(); }

@@ -5,6 +5,7 @@
 #include <atomic>
 #include <mutex>
 #include <string>
+#include <utility>
 
 #include "tarsel/host/events.h"
 
@@ -77,6 +78,8 @@ class Progress {
     // The line goes.
     void finish(const ProgressState& state);
     bool onTerminal() const { return line_; }
+    // What is in front from now on. On the thread that updates.
+    void setLabel(std::string label) { label_ = std::move(label); }
     RunningTime& time() { return time_; }
 
   private:

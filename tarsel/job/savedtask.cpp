@@ -39,27 +39,31 @@ AnyDict newState(const JobParts& parts, const JobOptions& options) {
 
 // A task has to find its files again.
 void requireNames(const AnyDict& state, const JobOptions& options) {
+    const std::string place = options.saveTask.empty() ? "the task" : options.saveTask;
     AnyDict looked = state;
     changeTaskFiles(looked, [&](const std::string& name, TaskFileUse) {
-        if (!xmlKeeps(name)) throw failure(Msg::xmlNameLost, {options.saveTask, name});
+        if (!xmlKeeps(name)) throw failure(Msg::xmlNameLost, {place, name});
         return name;
     });
-    if (!xmlKeeps(options.post)) throw failure(Msg::xmlNameLost, {options.saveTask, options.post});
+    if (!xmlKeeps(options.post)) throw failure(Msg::xmlNameLost, {place, options.post});
 }
 
 }  // namespace
 
-void saveTask(JobParts& parts, const JobOptions& options, Signals& signals) {
-    if (!parts.outputs.hasTask()) return;
+AnyDict storedState(JobParts& parts, const JobOptions& options) {
     AnyDict state =
         parts.stored ? static_cast<const AnyDict&>(parts.stored->state()) : newState(parts, options);
     if (!options.post.empty()) state.set("postProcess", options.post.c_str());
-    const Signals::Watch storing(signals, {.first = {}, .second = [&] { return parts.outputs.leave(); }});
-    if (options.relative)
-        makeRelative(state, fs::path(options.saveTask).parent_path().string());
-    else
-        makeAbsolute(state);
+    makeAbsolute(state);
     requireNames(state, options);
+    return state;
+}
+
+void saveTask(JobParts& parts, const JobOptions& options, Signals& signals) {
+    if (!parts.outputs.hasTask()) return;
+    AnyDict state = storedState(parts, options);
+    const Signals::Watch storing(signals, {.first = {}, .second = [&] { return parts.outputs.leave(); }});
+    if (options.relative) makeRelative(state, fs::path(options.saveTask).parent_path().string());
     const std::string reason = writeTask(state, parts.outputs.beginTask());
     if (!reason.empty()) throw writeFailure(options.saveTask, parts.outputs.withFinalNames(reason));
 }

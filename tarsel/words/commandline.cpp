@@ -18,9 +18,17 @@ std::vector<std::string> commandNames(const CLI::App& app) {
     return names;
 }
 
-std::string helpOf(const CLI::App& app) {
-    return app.get_parent() ? "tarsel " + app.get_name() + " --help" : "tarsel --help";
+// "tarsel batch LIST add" of a command within one.
+std::string wholeName(const CLI::App& app) {
+    const CLI::App* const parent = app.get_parent();
+    if (!parent) return app.get_name();
+    std::string name = wholeName(*parent);
+    for (const CLI::Option* option : parent->get_options())
+        if (option->get_positional()) name += " " + option->get_name(true);
+    return name + " " + app.get_name();
 }
+
+std::string helpOf(const CLI::App& app) { return wholeName(app) + " --help"; }
 
 // "-o,--output" as "--output".
 std::string nameOf(const CLI::Option& option) {
@@ -42,7 +50,7 @@ std::string nameOf(const CLI::Option& option) {
 // Wrong use, which the parser reports in words of its own.
 [[noreturn]] void wrongUse(const CLI::App& app, const CLI::ParseError& error) {
     const CLI::App* used = &app;
-    for (const CLI::App* sub : app.get_subcommands()) used = sub;
+    while (!used->get_subcommands().empty()) used = used->get_subcommands().back();
     // A mistyped option may be why another one is missing.
     if (dynamic_cast<const CLI::ExtrasError*>(&error) || (used != &app && used->remaining_size() > 0))
         unexpected(*used);
@@ -50,6 +58,8 @@ std::string nameOf(const CLI::Option& option) {
     for (const CLI::Option* option : used->get_options())
         if (option->get_required() && option->count() == 0)
             throw failure(Msg::argumentMissing, {nameOf(*option), helpOf(*used)});
+    if (const auto commands = commandNames(*used); used != &app && !commands.empty())
+        throw failure(Msg::argumentMissing, {joined(commands, "|"), helpOf(*used)});
     throw failure(Msg::commandLineWrong, {helpOf(*used)});
 }
 
@@ -69,7 +79,7 @@ class WordCheck {
                 longOption(word);
             else if (word.size() > 1 && word[0] == '-')
                 shortOptions(word);
-            else if (!app_->get_parent() && !word.empty())
+            else if (!word.empty() && !app_->get_subcommands({}).empty())
                 enter(word);
         }
     }
@@ -79,9 +89,23 @@ class WordCheck {
     void enter(const std::string& word) {
         const auto named = [&](const CLI::App* sub) { return sub->get_name() == word; };
         const auto commands = app_->get_subcommands(named);
-        if (commands.empty())
-            throw failure(Msg::commandUnknown, {word, suggestion(word, commandNames(*app_))});
-        app_ = commands.front();
+        if (!commands.empty()) {
+            arguments_ = 0;
+            app_ = commands.front();
+            return;
+        }
+        if (app_->get_parent() && arguments_++ < countArguments(*app_)) return;
+        const auto names = commandNames(*app_);
+        if (app_->get_parent())
+            throw failure(Msg::choiceUnknown,
+                          {wholeName(*app_), word, suggestion(word, names), joined(names)});
+        throw failure(Msg::commandUnknown, {word, suggestion(word, names)});
+    }
+
+    static int countArguments(const CLI::App& app) {
+        int count = 0;
+        for (const CLI::Option* option : app.get_options()) count += option->get_positional() ? 1 : 0;
+        return count;
     }
 
     const CommandLine::Taken* find(const std::string& name) const {
@@ -154,6 +178,7 @@ class WordCheck {
     const std::vector<CommandLine::Taken>& options_;
     std::span<char*> words_;
     size_t at_ = 0;
+    int arguments_ = 0;  // of a command that has commands, so far
     std::vector<const CommandLine::Taken*> seen_;
 };
 
@@ -219,6 +244,11 @@ void Command::flagOrValue(const char* names, std::string& to, const char* help, 
     line_.taken_.back().offers = offers;
 }
 
+Command Command::command(const char* name, const char* help) {
+    app_.require_subcommand(1);
+    return Command(*app_.add_subcommand(name, help), line_);
+}
+
 void Command::action(std::function<void()> run, std::function<void()> prepare) {
     app_.callback([line = &line_, run = std::move(run), prepare = std::move(prepare)] {
         line->chosen_ = run;
@@ -276,15 +306,20 @@ std::vector<std::string> CommandLine::valuesOf(const CLI::Option& option) const 
     return {};
 }
 
+CommandText CommandLine::describedCommand(const CLI::App& app) const {
+    CommandText command{app.get_name(), app.get_description(), {}, describedOptions(app), {}};
+    for (const CLI::Option* option : app.get_options())
+        if (option->get_positional())
+            command.arguments.push_back({option->get_name(true), option->get_description(), valuesOf(*option),
+                                         option->get_required(), option->get_expected_max() > 1});
+    for (const CLI::App* sub : app.get_subcommands({})) command.commands.push_back(describedCommand(*sub));
+    return command;
+}
+
 ToolText CommandLine::described() const {
     ToolText tool{app_->get_name(), app_->get_description(), version_, describedOptions(*app_), {}};
     for (const CLI::App* sub : app_->get_subcommands({})) {
-        CommandText command{sub->get_name(), sub->get_description(), {}, describedOptions(*sub)};
-        for (const CLI::Option* option : sub->get_options())
-            if (option->get_positional())
-                command.arguments.push_back({option->get_name(true), option->get_description(),
-                                             valuesOf(*option), option->get_required(),
-                                             option->get_expected_max() > 1});
+        CommandText command = describedCommand(*sub);
         if (command.name == "help") command.arguments.front().values = commandNames(*app_);
         if (command.name == "completion") command.arguments.front().values = kShells;
         tool.commands.push_back(std::move(command));

@@ -55,6 +55,7 @@ class CommandLine {
   private:
     void addTexts();
     std::vector<std::string> valuesOf(const CLI::Option& option) const;
+    CommandText describedCommand(const CLI::App& app) const;
     std::vector<OptionText> describedOptions(const CLI::App& app) const;
 
     std::unique_ptr<CLI::App> app_;
@@ -92,6 +93,9 @@ class Command {
                      const std::vector<std::string>& offers = {});
     // The heading in the help of the options that follow; "" ends it.
     void group(const char* heading) { group_ = heading; }
+
+    // A command of this one, "add" in "batch LIST add": its name follows the arguments, and one is needed.
+    Command command(const char* name, const char* help);
 
     // What runs when this command was given, once the whole line has been read; `prepare` before the engine
     // starts.

@@ -30,7 +30,12 @@ struct CommandText {
     std::string name, help;
     std::vector<ArgumentText> arguments;
     std::vector<OptionText> options;
+    std::vector<CommandText> commands;  // after the arguments, one of which is needed
 };
+
+// The same for a shell that knows one level: with the names of its commands as an argument, and the options
+// and arguments of all of them.
+CommandText flattened(const CommandText& command);
 
 struct ToolText {
     std::string name, description, version;

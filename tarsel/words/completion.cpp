@@ -9,6 +9,26 @@ Names namedBy(const std::string& type) {
     return type.rfind("FILE", 0) == 0 || type.rfind("INPUT", 0) == 0 ? Names::file : Names::nothing;
 }
 
+CommandText flattened(const CommandText& command) {
+    if (command.commands.empty()) return command;
+    CommandText flat = command;
+    flat.commands.clear();
+    ArgumentText names{"COMMAND", "", {}, true, false};
+    bool files = false;
+    for (const CommandText& one : command.commands) {
+        names.values.push_back(one.name);
+        for (const ArgumentText& argument : one.arguments)
+            files = files || namedBy(argument.name) == Names::file;
+        for (const OptionText& option : one.options) {
+            const auto same = [&](const OptionText& other) { return other.longName == option.longName; };
+            if (std::none_of(flat.options.begin(), flat.options.end(), same)) flat.options.push_back(option);
+        }
+    }
+    flat.arguments.push_back(names);
+    if (files) flat.arguments.push_back({"FILE", "", {}, false, true});
+    return flat;
+}
+
 namespace {
 
 std::vector<std::string> namesOf(const OptionText& option) {
@@ -72,8 +92,11 @@ std::string bash(const ToolText& tool) {
     for (const auto& command : tool.commands) {
         const bool any = !command.arguments.empty();
         const ArgumentText argument = any ? command.arguments.front() : ArgumentText();
-        cases += bashCommand(command.name, command.options,
-                             any ? bashOffer(argument.name, argument.values) : "kind=none");
+        std::string offer = any ? bashOffer(argument.name, argument.values) : "kind=none";
+        // Of the second one only words can be told from files.
+        if (command.arguments.size() > 1 && !command.arguments[1].values.empty())
+            offer += " words=" + shellQuoted(joined(command.arguments[1].values, " "));
+        cases += bashCommand(command.name, command.options, offer);
     }
     return "# Completion of tarsel for bash, made by 'tarsel completion bash'.\n"
            "\n"
@@ -121,7 +144,7 @@ std::string bash(const ToolText& tool) {
            "    words) mapfile -t COMPREPLY < <(compgen -P \"$prefix\" -W \"$words\" -- \"$current\") ;;\n"
            "    files)\n"
            "        compopt -o filenames 2>/dev/null\n"
-           "        mapfile -t COMPREPLY < <(compgen -P \"$prefix\" -f -- \"$current\")\n"
+           "        mapfile -t COMPREPLY < <(compgen -P \"$prefix\" -f -W \"$words\" -- \"$current\")\n"
            "        ;;\n"
            "    folders)\n"
            "        compopt -o filenames 2>/dev/null\n"
@@ -264,6 +287,8 @@ std::string fish(const ToolText& tool) {
 
 }  // namespace
 
-std::string completionFor(const std::string& shell, const ToolText& tool) {
+std::string completionFor(const std::string& shell, const ToolText& nested) {
+    ToolText tool = nested;
+    for (CommandText& command : tool.commands) command = flattened(command);
     return shell == "zsh" ? zsh(tool) : shell == "fish" ? fish(tool) : bash(tool);
 }

@@ -49,11 +49,22 @@ std::string entries(const std::vector<OptionText>& options) {
     return text;
 }
 
-std::string synopsis(const CommandText& command) {
-    std::string line = bold("tarsel " + command.name);
+std::string words(const CommandText& command) {
+    std::string line;
     for (const auto& argument : command.arguments) {
         const std::string word = slanted(argument.name) + (argument.many ? "..." : "");
         line += argument.required ? " " + word : " [" + word + "]";
+    }
+    return line;
+}
+
+// `before`: of a command within another one, that and its arguments.
+std::string synopsis(const CommandText& command, const std::string& before = bold("tarsel")) {
+    std::string line = before + bold(" " + command.name) + words(command);
+    if (!command.commands.empty()) {
+        std::string lines;
+        for (const auto& one : command.commands) lines += synopsis(one, line);
+        return lines;
     }
     for (const auto& option : command.options)
         if (option.longName == "--output" && option.takesValue()) {
@@ -78,6 +89,17 @@ constexpr struct {
 
 }  // namespace
 
+namespace {
+
+std::string section(const CommandText& command) {
+    std::string text = roff(command.help) + ".\n";
+    for (const auto& argument : command.arguments)
+        text += ".TP\n" + slanted(argument.name) + "\n" + roff(argument.help) + ".\n";
+    return text + entries(command.options);
+}
+
+}  // namespace
+
 std::string manualOf(const ToolText& tool) {
     std::string text = ".TH TARSEL 1 \"\" " + std::string("\"") + roff(tool.version) +
                        "\" \"User Commands\"\n.SH NAME\ntarsel \\- transcodes, inspects and draws media\n"
@@ -88,10 +110,9 @@ std::string manualOf(const ToolText& tool) {
             ".SH OPTIONS\nBefore the command:\n" +
             entries(tool.options);
     for (const auto& command : tool.commands) {
-        text += ".SH TARSEL " + roff(command.name) + "\n" + roff(command.help) + ".\n";
-        for (const auto& argument : command.arguments)
-            text += ".TP\n" + slanted(argument.name) + "\n" + roff(argument.help) + ".\n";
-        text += entries(command.options);
+        text += ".SH TARSEL " + roff(command.name) + "\n" + section(command);
+        for (const auto& one : command.commands)
+            text += ".SS " + roff(command.name) + words(command) + " " + roff(one.name) + "\n" + section(one);
     }
     text += ".SH EXIT STATUS\n";
     for (const auto& row : kStatus) text += ".TP\n" + bold(row.status) + "\n" + roff(row.meaning) + "\n";

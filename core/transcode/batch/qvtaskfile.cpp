@@ -13,6 +13,7 @@
 #include "core/arch/qvexception.h"
 #include "core/document/xmldom.h"
 #include "core/document/xmlline_p.h"
+#include "core/document/xmltrans.h"
 #include "core/encode/qvencodepipe.h"
 #include "core/engine/modules/qvmodule.h"
 #include "core/engine/modules/qvregistry.h"
@@ -424,6 +425,31 @@ QvTaskFault QvTaskFile::check(const Any& file) noexcept {
     return guarded([&] {
         AnyDict state;
         return checked(file, state);
+    });
+}
+
+QvTaskFault QvTaskFile::check(const AnyDict& state) noexcept {
+    return guarded([&]() -> QvTaskFault {
+        const Any& kind = state.get("__class__");
+        const Any& version = state.get("__version__");
+        if (!(kind == rootName)) return {QvStatus::invalidStructure, "", 0, "this is no task"};
+        if (!version.isString()) return {QvStatus::invalidStructure, "", 0, "its version is missing"};
+        // As it would be in a file of its own.
+        AnyDict plain = state;
+        plain.remove("__class__");
+        plain.remove("__version__");
+        const auto root = std::make_unique<XmlNode>(rootName);
+        root->setAttr("version", version);
+        XmlTrans().DictToXml(plain, root.get());
+        const Place whole{root.get(), "", {}};
+        try {
+            checkTask(whole);
+            checkModules(whole);
+            tryEncoder(whole, state);
+        } catch (const Fault& fault) {
+            return {fault.status, fault.place.path, 0, fault.reason};
+        }
+        return {};
     });
 }
 

@@ -15,6 +15,7 @@
 #include "core/decode/qvdpipelist.h"
 #include "core/transcode/batch/qvbatchtask.h"
 #include "core/value/any.h"
+#include "core/value/anycontainer.h"
 
 class QvEncodePipe;
 struct QvFileOpenCb;
@@ -35,6 +36,9 @@ class QV_API QvTaskFile {
     // The document, its values and what a task must hold; then the modules that it names are looked for, and
     // the output is made once, which opens no file. Inputs are not opened.
     static QvTaskFault check(const Any& file) noexcept;
+    // The same for a task that is a part of another document, as of a batch list: a dictionary that holds its
+    // own "__class__" and "__version__". `line` is 0 always.
+    static QvTaskFault check(const AnyDict& state) noexcept;
 
     // Checks a file and restores its task: the caller owns the task, the pipe and the decoders. A task with
     // one segment that is not disabled is restored as QvTask::fromState does, any other is a QvBatchTask with

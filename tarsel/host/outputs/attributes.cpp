@@ -8,7 +8,7 @@
 #include <sys/xattr.h>
 #include <unistd.h>
 
-#include "tarsel/host/outputs/descriptor.h"
+#include "tarsel/host/descriptor.h"
 
 namespace {
 

@@ -10,6 +10,7 @@
 #include <unistd.h>
 
 #include "tarsel/host/events.h"
+#include "tarsel/host/files.h"
 #include "tarsel/host/outputs/attributes.h"
 #include "tarsel/host/outputs/foldercalls.h"
 #include "tarsel/host/outputs/recovery.h"
@@ -345,6 +346,7 @@ void Outputs::plan() {
         checkFinal(name);
         fresh.push_back({file.filename().string(), targetOf(name).filename().string()});
         names_.push_back(name.string());
+        if (policy_.placing) placed_.push_back({file.string(), absoluteName(name.string())});
     }
     const auto first = std::find(names_.begin(), names_.end(), output_.string());
     if (first != names_.end()) std::rotate(names_.begin(), first, first + 1);
@@ -390,6 +392,12 @@ void Outputs::commit(std::span<Outputs* const> all) {
     if (all.empty()) return;
     for (Outputs* const one : all) one->plan();
     const Outputs& first = *all.front();
+    if (first.policy_.placing) {
+        std::vector<PlacedFile> files;
+        for (const Outputs* const one : all)
+            files.insert(files.end(), one->placed_.begin(), one->placed_.end());
+        first.policy_.placing(files);
+    }
     const auto result = first.transaction_->commit(first.policy_.overwrite, first.policy_.sync);
     if (!result.synced)
         throw failure(Msg::outputNotSynced, {first.output_.string(), std::strerror(result.moved.error)});

@@ -4,6 +4,7 @@
 #pragma once
 
 #include <filesystem>
+#include <functional>
 #include <memory>
 #include <optional>
 #include <span>
@@ -12,6 +13,12 @@
 
 #include "tarsel/host/outputs/transaction.h"
 #include "tarsel/words/numberedname.h"
+
+// A file of a job that is complete and about to get its name.
+struct PlacedFile {
+    std::string written;  // where it is until then
+    std::string name;     // absolute
+};
 
 // How results may be written.
 struct OutputPolicy {
@@ -25,6 +32,8 @@ struct OutputPolicy {
     bool recover = true;       // put in order what ended runs have left in the folder
     bool quiet = false;        // say nothing of that
     long long stale = kStale;  // seconds after which a work folder of another host was left
+    // Hears of all files of a job before the first one gets its name; what it throws leaves them without.
+    std::function<void(const std::vector<PlacedFile>& files)> placing = {};
 };
 
 // What is written under one name of the user's: a file, or a set of files that have names made from it. An
@@ -107,4 +116,5 @@ class Outputs {
     std::string base_;                     // of the files in the hidden folder
     std::string extension_;                // that begin was given
     std::vector<std::string> names_;
+    std::vector<PlacedFile> placed_;  // what plan() has found
 };

@@ -10,7 +10,6 @@
 #include <unistd.h>
 
 #include "tarsel/host/outputs/foldercalls.h"
-#include "tarsel/words/messages.h"
 
 namespace fs = std::filesystem;
 
@@ -46,16 +45,17 @@ int keepMode(const fs::path& from, const fs::path& to) {
 
 }  // namespace
 
-SharedFile::SharedFile(const std::string& name) : name_(placeOf(name).string()) {
+SharedFile::SharedFile(const std::string& name, Msg refused)
+    : name_(placeOf(name).string()), refused_(refused) {
     if (const fs::path folder = fs::path(name_).parent_path(); !folder.empty()) {
         std::error_code error;
         fs::create_directories(folder, error);
-        if (error) throw systemFailure(Msg::presetsNotWritten, folder.string(), error.value());
+        if (error) throw systemFailure(refused_, folder.string(), error.value());
     }
     const std::string lock = name_ + ".lock";
     lock_.reset(open(lock.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW, kNewFile));
     const int result = lock_ ? lockFile(lock_.get()) : errno;
-    if (result != 0) throw systemFailure(Msg::presetsNotWritten, lock, result);
+    if (result != 0) throw systemFailure(refused_, lock, result);
 }
 
 void SharedFile::replace(const std::function<void(const std::string& name)>& write) {
@@ -69,7 +69,7 @@ void SharedFile::replace(const std::function<void(const std::string& name)>& wri
         unlink(fresh.c_str());
         throw;
     }
-    const Descriptor open(openFolder(folder.c_str()));
+    const Descriptor open(openFolder(folder.empty() ? "." : folder.c_str()));
     if (!open) result = errno;
     if (result == 0) result = keepMode(place, fresh);
     if (result == 0) result = syncFile(open.get(), (entry + ".new").c_str());
@@ -77,5 +77,5 @@ void SharedFile::replace(const std::function<void(const std::string& name)>& wri
     if (result == 0) result = syncFolder(open.get());
     if (result == 0) return;
     unlink(fresh.c_str());
-    throw systemFailure(Msg::presetsNotWritten, name_, result);
+    throw systemFailure(refused_, name_, result);
 }

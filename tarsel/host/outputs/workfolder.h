@@ -10,7 +10,7 @@
 #include <string>
 #include <string_view>
 
-#include "tarsel/host/outputs/descriptor.h"
+#include "tarsel/host/descriptor.h"
 
 class WorkFolder {
   public:

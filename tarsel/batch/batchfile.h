@@ -1,0 +1,51 @@
+// A list of tasks as a file, and the names of what is next to it.
+//
+//     night.xml              the list
+//     night.xml.lock         locked while a run of the tool changes the list
+//     night.xml.journal.d/   what was done: a file for each task, and the lock of the run
+#pragma once
+
+#include <functional>
+#include <string>
+#include <vector>
+
+#include "tarsel/batch/batchtask.h"
+#include "tarsel/host/descriptor.h"
+
+class BatchFile {
+  public:
+    // `name`: as the user gave it. Symbolic links are followed, so that a list has one journal.
+    explicit BatchFile(const std::string& name);
+
+    const std::string& shown() const { return shown_; }  // as the user gave it
+    const std::string& name() const { return name_; }    // absolute
+    std::string folder() const;                          // that relative names in the list count from
+    std::string runLock() const { return journalFolder() + "run"; }
+    std::string journal(const std::string& id) const { return journalFolder() + id; }
+
+    // Throws Failure (input) for a file that can't be read or is no list.
+    QvBatchList load() const;
+    // Its tasks, without their states.
+    std::vector<BatchTask> tasks() const { return tasksOf(load()); }
+    std::vector<BatchTask> tasksOf(const QvBatchList& list) const;
+    // One task of the list as a document of its own, for a process that need not read the whole list; and
+    // that task there. Both throw Failure.
+    static Descriptor handOver(const QvBatchList& list, size_t index);
+    BatchTask handedTask(int descriptor, int number) const;
+    // Makes an empty list. Throws Failure (output) if the file exists, unless `overwrite`.
+    void make(bool overwrite) const;
+    // Loads the list, changes it and puts it in the place of the old one, while no other run can. The file
+    // is unchanged if `change` throws.
+    void change(const std::function<void(QvBatchList& list)>& change) const;
+
+  private:
+    std::string journalFolder() const { return name_ + ".journal.d/"; }
+
+    std::string shown_, name_;
+};
+
+// Whether a word is the number of a task, be there such a task or not.
+bool isTaskNumber(const std::string& word);
+// The index in `tasks` of the task that a word names: its number, or the first digits of its name. Throws
+// Failure (usage).
+size_t findTask(const std::vector<BatchTask>& tasks, const std::string& word, const BatchFile& file);

@@ -1,0 +1,161 @@
+// tarsel batch LIST run: all tasks that are left, or some of them in this process.
+#include <algorithm>
+#include <climits>
+#include <thread>
+
+#include "tarsel/batch/runner.h"
+#include "tarsel/batch/taskrun.h"
+#include "tarsel/commands/batchcommands.h"
+#include "tarsel/commands/outputoptions.h"
+#include "tarsel/commands/progressoption.h"
+#include "tarsel/host/childprocess.h"
+#include "tarsel/host/events.h"
+#include "tarsel/host/signals.h"
+#include "tarsel/words/commandline.h"
+#include "tarsel/words/messages.h"
+#include "tarsel/words/timespec.h"
+
+namespace {
+
+using Words = std::vector<std::string>;
+
+constexpr int kMostJobs = 64;
+constexpr int kMostRetries = 100;
+
+struct Given {
+    OutputOptions outputs;
+    ProgressOption progress;
+    std::string jobs, retries, timeout, threads, handed;
+    Words tasks;
+    bool stopOnError = false, verify = false, quiet = false;
+    bool allowPost = false, acceptPartial = false, strict = false;
+};
+
+// --- Some tasks in this process.
+
+void runTasks(const Given& given, const BatchFile& file, Signals& signals) {
+    limitThreads(given.threads);
+    TaskRun how;
+    how.job.policy = given.outputs.policy();
+    how.job.policy.quiet = how.job.quiet = given.quiet;
+    how.job.progress = given.progress.mode;
+    how.job.acceptPartial = given.acceptPartial;
+    how.job.strict = given.strict;
+    how.allowPost = given.allowPost;
+    how.verify = given.verify;
+    how.plan = planWords;
+    if (!given.handed.empty()) {
+        const auto number = static_cast<int>(parseNumber(given.handed, 1, INT_MAX, "--handed"));
+        return how.run(file, file.handedTask(ChildProcess::kHanded, number), signals);
+    }
+    QvBatchList list = file.load();
+    const std::vector<BatchTask> tasks = file.tasksOf(list);
+    std::vector<size_t> wanted;
+    for (const std::string& word : given.tasks) wanted.push_back(findTask(tasks, word, file));
+    for (const size_t i : wanted) {
+        const int index = static_cast<int>(i);
+        how.run(file, batchTask(list.at(index), index + 1, file.folder()), signals);
+    }
+}
+
+// --- All that is left.
+
+double timeLimit(const std::string& text) {
+    if (text.empty()) return -1;
+    const double seconds = parseTime(text, std::nullopt, "--timeout").seconds();
+    if (seconds <= 0) throw failure(Msg::timeWrong, {"--timeout", text});
+    return seconds;
+}
+
+int numberOf(const std::string& text, int otherwise, int low, int high, const char* option) {
+    return text.empty() ? otherwise : static_cast<int>(parseNumber(text, low, high, option));
+}
+
+Words commandOf(const Given& given, const BatchFile& file, const Words& before, int jobs) {
+    Words words = {ownProgram()};
+    words.insert(words.end(), before.begin(), before.end());
+    words.insert(words.end(), {"batch", file.name(), "run", "--progress", "json"});
+    const struct {
+        bool on;
+        const char* option;
+    } flags[] = {{given.outputs.overwrite, "-y"},          {given.outputs.keep, "-n"},
+                 {given.outputs.noSync, "--no-sync"},      {given.verify, "--verify"},
+                 {given.allowPost, "--allow-post"},        {given.strict, "--strict"},
+                 {given.acceptPartial, "--accept-partial"}};
+    for (const auto& flag : flags)
+        if (flag.on) words.emplace_back(flag.option);
+    if (!given.outputs.stale.empty()) words.insert(words.end(), {"--stale", given.outputs.stale});
+    const int cores = static_cast<int>(std::thread::hardware_concurrency());
+    const int threads = std::max(cores / jobs, 1);
+    if (!given.threads.empty())
+        words.insert(words.end(), {"--threads", given.threads});
+    else if (jobs > 1)
+        words.insert(words.end(), {"--threads", std::to_string(threads)});
+    words.emplace_back("--handed");
+    return words;
+}
+
+void runAll(const Given& given, const BatchFile& file, const Words& before, Signals& signals) {
+    BatchOptions options;
+    options.jobs = numberOf(given.jobs, 1, 1, kMostJobs, "--jobs");
+    options.retries = numberOf(given.retries, 0, 0, kMostRetries, "--retry");
+    options.timeout = timeLimit(given.timeout);
+    options.timeoutText = given.timeout;
+    options.stopOnError = given.stopOnError;
+    options.verify = given.verify;
+    options.quiet = given.quiet;
+    options.progress = given.progress.mode;
+    options.policy = given.outputs.policy();
+    options.command = commandOf(given, file, before, options.jobs);
+    const BatchResult result = BatchRunner(file, options, signals).run();
+    const auto count = [&](auto... ends) {
+        return std::count_if(result.tasks.begin(), result.tasks.end(),
+                             [&](const BatchTaskResult& task) { return ((task.end == ends) || ...); });
+    };
+    const auto done = count(TaskEnd::done, TaskEnd::already), failed = count(TaskEnd::failed);
+    const std::string all = std::to_string(static_cast<long>(result.tasks.size()) - count(TaskEnd::disabled));
+    Words outputs;
+    for (const BatchTaskResult& task : result.tasks)
+        if (task.end == TaskEnd::done)
+            outputs.insert(outputs.end(), task.written.begin(), task.written.end());
+    Events::get().wrote(outputs);
+    if (const auto status = static_cast<Exit>(result.status); status != Exit::done && status != Exit::failed)
+        throw Failure(status, lineOf(Msg::batchStopped, {std::to_string(done), all, file.shown()}));
+    if (failed > 0) throw failure(Msg::batchTasksFailed, {file.shown(), std::to_string(failed), all});
+    if (!given.quiet)
+        tell(Level::note, (all == "1" ? "1 task is" : "all " + all + " tasks are") + " done, in " +
+                              formatTime(result.seconds).substr(0, 7));
+}
+
+}  // namespace
+
+void addBatchRun(Command& batch, Signals& signals, const ListName& list, const std::string& version,
+                 std::function<std::vector<std::string>()> before) {
+    Command command = batch.command("run", "Run the tasks that are not done");
+    const auto given = std::make_shared<Given>();
+    command.option("--jobs", given->jobs, "So many tasks at a time (1)", "N");
+    command.option("--retry", given->retries, "Try a task that failed so often again (0)", "N");
+    command.option("--timeout", given->timeout, "Stop a task that takes longer: SS, MM:SS, HH:MM:SS", "TIME");
+    command.flag("--stop-on-error", given->stopOnError, "Begin no task after one has failed");
+    command.flag("--verify", given->verify, "Know what was done by the bytes of the outputs as well");
+    command.list("--task", given->tasks, "Run only this task, in this process", "TASK");
+    command.option("--handed", given->handed, "Of the processes of a run: the task is in descriptor 3", "N");
+    given->progress.add(command);
+    command.flag("--allow-post", given->allowPost, "Run the commands that tasks have for afterwards");
+    command.flag("--accept-partial", given->acceptPartial, "Take what is there of damaged inputs");
+    command.flag("--strict", given->strict, "Let a task fail if there is a warning");
+    addThreads(command, given->threads);
+    given->outputs.add(command);
+    command.flag("-q,--quiet", given->quiet, "Say nothing but errors");
+    command.action(
+        [&signals, list, given, before] {
+            const BatchFile file(*list);
+            if (given->tasks.empty() && given->handed.empty()) return runAll(*given, file, before(), signals);
+            for (const auto& [value, name] : {std::pair{&given->jobs, "--jobs"},
+                                              {&given->retries, "--retry"},
+                                              {&given->timeout, "--timeout"}})
+                if (!value->empty()) throw failure(Msg::optionsExclude, {"--task", name});
+            runTasks(*given, file, signals);
+        },
+        [list, given, version] { given->progress.open("", {*list}, given->outputs.overwrite, version); });
+}

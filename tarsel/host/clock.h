@@ -1,0 +1,6 @@
+// The time of day.
+#pragma once
+
+#include <ctime>
+
+std::time_t secondsSince1970();

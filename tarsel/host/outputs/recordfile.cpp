@@ -1,0 +1,141 @@
+#include "tarsel/host/outputs/recordfile.h"
+
+#include <cerrno>
+#include <cstdint>
+#include <cstdio>
+#include <filesystem>
+
+#include <fcntl.h>
+#include <sys/file.h>
+#include <sys/stat.h>
+
+#include "tarsel/host/outputs/foldercalls.h"
+#include "tarsel/host/outputs/owner.h"
+#include "tarsel/words/messages.h"
+
+namespace fs = std::filesystem;
+
+namespace {
+
+constexpr size_t kSumDigits = 16;
+constexpr size_t kMostBytes = 64 << 20;  // of a file; what is longer was not written here
+
+// FNV-1a of 64 bits.
+std::string checksum(std::string_view text) {
+    uint64_t sum = 0xcbf29ce484222325;
+    for (const char c : text) sum = (sum ^ static_cast<unsigned char>(c)) * 0x100000001b3;
+    char digits[kSumDigits + 1];
+    std::snprintf(digits, sizeof digits, "%016llx", static_cast<unsigned long long>(sum));
+    return digits;
+}
+
+[[noreturn]] void refuse(const std::string& name, int error) {
+    throw systemFailure(Msg::outputSystem, name, error);
+}
+
+int flockFor(int file, int how) {
+    int result;
+    do result = flock(file, how);
+    while (result != 0 && errno == EINTR);
+    return result == 0 ? 0 : errno;
+}
+
+bool writeAll(int file, std::string_view bytes) {
+    while (!bytes.empty()) {
+        const ssize_t written = write(file, bytes.data(), bytes.size());
+        if (written < 0 && errno == EINTR) continue;
+        if (written < 0) return false;
+        bytes.remove_prefix(static_cast<size_t>(written));
+    }
+    return true;
+}
+
+// Makes the folder of `name` if it is missing.
+void makeFolderOf(const std::string& name) {
+    const fs::path folder = fs::path(name).parent_path();
+    std::error_code error;
+    fs::create_directories(folder, error);
+    if (error) refuse(folder.string(), error.value());
+}
+
+Descriptor openShared(const std::string& name) {
+    makeFolderOf(name);
+    Descriptor file(open(name.c_str(), O_RDWR | O_CREAT | O_APPEND | O_CLOEXEC | O_NOFOLLOW, 0666));
+    if (!file) refuse(name, errno);
+    return file;
+}
+
+std::string contentsOf(int file) {
+    std::string bytes;
+    char block[4096];
+    for (off_t at = 0; bytes.size() < kMostBytes; at = static_cast<off_t>(bytes.size())) {
+        const ssize_t got = pread(file, block, sizeof block, at);
+        if (got < 0 && errno == EINTR) continue;
+        if (got <= 0) break;
+        bytes.append(block, static_cast<size_t>(got));
+    }
+    return bytes;
+}
+
+}  // namespace
+
+RecordFile::RecordFile(const std::string& name) : name_(name), file_(openShared(name)) {}
+
+bool RecordFile::tryLock() {
+    const int error = flockFor(file_.get(), LOCK_EX | LOCK_NB);
+    if (error != 0 && error != EWOULDBLOCK) refuse(name_, error);
+    return error == 0;
+}
+
+void RecordFile::lock() {
+    if (const int error = flockFor(file_.get(), LOCK_EX)) refuse(name_, error);
+}
+
+void RecordFile::append(std::string_view text, bool sync) {
+    struct stat status;
+    if (fstat(file_.get(), &status) != 0) refuse(name_, errno);
+    char last = '\n';
+    if (status.st_size > 0 && pread(file_.get(), &last, 1, status.st_size - 1) != 1) refuse(name_, errno);
+    std::string line = last == '\n' ? "" : "\n";  // after one that was cut
+    line += checksum(text) + " " + std::string(text) + "\n";
+    if (!writeAll(file_.get(), line)) refuse(name_, errno);
+    if (!sync) return;
+    if (fdatasync(file_.get()) != 0 && errno != EINVAL) refuse(name_, errno);
+    if (entered_) return;
+    const Descriptor folder(openFolder(fs::path(name_).parent_path().c_str()));
+    if (const int error = folder ? syncFolder(folder.get()) : errno) refuse(name_, error);
+    entered_ = true;
+}
+
+bool RecordFile::isLocked(const std::string& name) {
+    const Descriptor file(open(name.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK));
+    return file && flockFor(file.get(), LOCK_SH | LOCK_NB) == EWOULDBLOCK;
+}
+
+std::vector<std::string> RecordFile::read(const std::string& name) {
+    std::vector<std::string> lines;
+    const Descriptor file(open(name.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK));
+    if (!file) return lines;
+    const std::string bytes = contentsOf(file.get());
+    for (size_t at = 0, end; (end = bytes.find('\n', at)) != std::string::npos; at = end + 1) {
+        const std::string_view line(bytes.data() + at, end - at);
+        if (line.size() <= kSumDigits + 1 || line[kSumDigits] != ' ') continue;
+        const std::string_view text = line.substr(kSumDigits + 1);
+        if (line.substr(0, kSumDigits) == checksum(text)) lines.emplace_back(text);
+    }
+    return lines;
+}
+
+NamedLock::NamedLock(const std::string& name, const std::string& shown) : file_(openShared(name)) {
+    int error = flockFor(file_.get(), LOCK_EX | LOCK_NB);
+    if (error == EWOULDBLOCK) {
+        const auto owner = Owner::parse(contentsOf(file_.get()));
+        // What a killed one has left takes a moment to go.
+        if (!owner || owner->state() != Owner::State::gone)
+            throw failure(Msg::batchRuns, {shown, owner ? std::to_string(owner->pid) : "?",
+                                           owner ? owner->host : "another host"});
+        error = flockFor(file_.get(), LOCK_EX);
+    }
+    if (error != 0) refuse(name, error);
+    if (ftruncate(file_.get(), 0) != 0 || !writeAll(file_.get(), Owner::self().text())) refuse(name, errno);
+}
