@@ -128,6 +128,7 @@ void addTranscode(CommandLine& line, Signals& signals, const std::string& versio
     given->progress.add(command);
     command.flag("--split-channels", job.splitChannels, "One WAV file a channel");
     command.flag("--accept-partial", job.acceptPartial, "Take what is there of a damaged input");
+    command.flag("--unchanged", job.unchanged, "Let the job fail if an INPUT changes while it is read");
     command.flag("--strict", job.strict, "Let the job fail if there is a warning");
     addThreads(command, given->threads);
     command.flag("--dry-run", job.dryRun, "Print the plan and do nothing");
