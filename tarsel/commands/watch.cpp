@@ -58,7 +58,7 @@ WatchOptions optionsOf(const Given& given, const std::string& folder, const Watc
     // A log of a service has a line for each file already.
     if (options.progress.how == ProgressMode::How::automatic && !stderrIsTerminal())
         options.progress.how = ProgressMode::How::off;
-    if (!given.raw.empty()) options.jobOptions.push_back("--raw=" + given.raw);
+    options.raw = given.raw;
     if (!given.threads.empty()) options.jobOptions.push_back("--threads=" + given.threads);
     if (given.acceptPartial) options.jobOptions.push_back("--accept-partial");
     if (given.strict) options.jobOptions.push_back("--strict");

@@ -8,6 +8,7 @@
 #include "tarsel/host/events.h"
 #include "tarsel/host/files.h"
 #include "tarsel/host/follow/filemoves.h"
+#include "tarsel/source/source.h"
 #include "tarsel/watch/copynames.h"
 #include "tarsel/words/json.h"
 #include "tarsel/words/messages.h"
@@ -321,6 +322,7 @@ Watcher::Ended Watcher::makeTarget(WatchedFile& file, int target, const std::str
     std::vector<std::string> arguments = {
         "transcode", path, "-o", output, "--preset=" + targets_.preset(target), "--unchanged"};
     if (torn || options_.overwrite) arguments.push_back("-y");
+    if (!options_.raw.empty() && !Source::describesItself(path)) arguments.push_back("--raw=" + options_.raw);
     arguments.insert(arguments.end(), options_.jobOptions.begin(), options_.jobOptions.end());
     Progress progress(options_.progress, options_.quiet, inQuotes(file.name) + "  ", false);
     progress.start();

@@ -24,6 +24,7 @@ struct WatchOptions {
     std::string folder, memory;
     After after = After::keep;
     std::string moveTo, failedTo;
+    std::string raw;                         // format of inputs that do not describe themselves
     std::vector<std::string> jobOptions;     // of each transcode
     double settleSeconds = 2;                // for which a file has to stay as it is
     std::optional<double> scanSeconds = {};  // between two looks at the whole folder

@@ -321,7 +321,7 @@ constexpr Message kMessages[] = {
     {Msg::watchFolderIsOther,  Exit::usage,  "{option}",                           "{file} is the watched folder or one that outputs go to", "choose another folder"},
     {Msg::watchMemory,         Exit::output, "can't keep what was done in {file}", "{text}",                                              "{text}"},
     {Msg::watchTwice,          Exit::failed, "can't keep what was done in {file}", "another 'tarsel watch' uses it",                      "stop that one, or give another file with --state"},
-    {Msg::watchBegins,         Exit::done,   "watching {file}",                    "",                                                    ""},
+    {Msg::watchBegins,         Exit::done,   "watching {file}",                    "each file is taken when it is complete",             ""},
     {Msg::watchEnds,           Exit::done,   "done with {file}",                   "files: {text}",                                       ""},
     {Msg::watchMade,           Exit::done,   "made of {name}",                     "{name}{text}",                                        ""},
     {Msg::watchLeft,           Exit::done,   "left {name}",                        "{text}",                                              ""},
@@ -334,6 +334,7 @@ constexpr Message kMessages[] = {
     {Msg::watchRunSilent,      Exit::failed, "the transcode failed",               "its process said no more than status {text}",         "run it by hand with 'tarsel transcode'"},
     {Msg::watchSomeFailed,     Exit::failed, "not all of {file} was made",         "files without their outputs: {text}, files done: {text}", "see the lines before"},
     {Msg::watchStopped,        Exit::failed, "stopped",                            "files done: {text}, failed: {text}",                  "what had begun is made again the next time"},
+    {Msg::reportKindUnknown,   Exit::usage,  "--report {file}",                    "its extension says no kind of report",                "write .html or .json"},
     // how a run ends
     {Msg::warningsCount,     Exit::failed, "can't make {file}",                        "with --strict a warning is a failure, and the job had {text}", "change what it warns of, or leave out --strict"},
     {Msg::linkFailed,        Exit::failed, "can't connect {file} to the output",       "its format does not fit the output's",                         "choose another format with --format or --pixel"},

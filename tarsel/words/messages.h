@@ -334,6 +334,7 @@ enum class Msg : unsigned short {
     watchRunSilent,
     watchSomeFailed,
     watchStopped,
+    reportKindUnknown,
     // how a run ends
     warningsCount,
     linkFailed,

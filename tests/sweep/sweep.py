@@ -21,6 +21,7 @@ import tempfile
 import time
 
 import faults
+import feeding
 import hostile
 import jobs
 import kills
@@ -40,6 +41,7 @@ ATTACKS = {  # kind: the unit that has its cases, and how many of them --quick r
     "rename": (faults, 20), "sync": (faults, 20), "thread": (faults, 15), "make": (faults, 10), "lock": (faults, 10),
     "kill": (kills, 60), "signal": (signals, 40), "hostile": (hostile, 100), "option": (options, 60),
     "output": (outputs, 1000), "limit": (limits, 20), "plugin": (plugins, 1000),
+    "watch": (feeding, 2),
 }
 
 
