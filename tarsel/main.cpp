@@ -98,6 +98,7 @@ int run(int argc, char** argv) {
     line.flag("--allow-unsafe-plugins", allowUnsafePlugins, "Load plug-ins that other users may change, too");
     addTranscode(line, signals, version);
     addRun(line, signals, version);
+    addWatch(line, signals, version);
     addTask(line, signals);
     addBatch(line, signals, version, {argv, argv + argc}, [&] {
         std::vector<std::string> before;

@@ -27,3 +27,4 @@ void addTask(CommandLine& line, Signals& signals);
 void addCompare(CommandLine& line, Signals& signals);
 void addScope(CommandLine& line, Signals& signals);
 void addFrame(CommandLine& line, Signals& signals, const std::string& version);
+void addWatch(CommandLine& line, Signals& signals, const std::string& version);

@@ -152,6 +152,7 @@ void addTranscode(CommandLine& line, Signals& signals, const std::string& versio
     command.flag("--relative", job.relative, "The task file names files as seen from its folder");
     given->progress.add(command);
     command.flag("--strict", job.strict, "Let the job fail if there is a warning");
+    command.flag("--unchanged", job.unchanged, "Let the job fail if an INPUT changes while it is read");
     addThreads(command, given->threads);
     command.flag("--dry-run", job.dryRun, "Print the plan and do nothing");
     given->outputs.add(command);

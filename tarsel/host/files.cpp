@@ -137,6 +137,12 @@ long long fileBytes(const std::string& name) {
     return error ? -1 : static_cast<long long>(size);
 }
 
+long long modifiedTime(const std::string& name) {
+    std::error_code error;
+    const auto time = fs::last_write_time(name, error);
+    return error ? -1 : static_cast<long long>(time.time_since_epoch().count());
+}
+
 int writeFile(const std::string& name, const std::string& text) {
     std::FILE* file = std::fopen(name.c_str(), "wb");
     if (!file) return errno;

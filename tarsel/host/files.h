@@ -43,7 +43,8 @@ bool isDevice(const std::string& name);
 bool samePlace(const std::string& first, const std::string& second);
 // Makes the file, or empties it, and writes `text`. 0 or an errno.
 int writeFile(const std::string& name, const std::string& text);
-long long fileBytes(const std::string& name);  // -1 if there is no such file
+long long fileBytes(const std::string& name);     // -1 if there is no such file
+long long modifiedTime(const std::string& name);  // a count that grows; -1 if there is no such file
 // The same with all symbolic links followed, as far as there is something.
 std::string resolvedName(const std::string& name);
 // Regular files whose names match a pattern of a shell ("in/*.wav"), sorted.

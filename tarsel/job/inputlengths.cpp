@@ -3,11 +3,15 @@
 #include "tarsel/host/files.h"
 #include "tarsel/words/messages.h"
 
+InputLengths::Row InputLengths::rowOf(const std::string& name) {
+    return {name, fileBytes(name), modifiedTime(name)};
+}
+
 InputLengths::InputLengths(std::span<const std::unique_ptr<Source>> sources,
                            std::span<const std::string> segments) {
     for (const auto& source : sources)
-        if (source->isFile()) rows_.push_back({source->name(), fileBytes(source->name())});
-    for (const std::string& segment : segments) rows_.push_back({segment, fileBytes(segment)});
+        if (source->isFile()) rows_.push_back(rowOf(source->name()));
+    for (const std::string& segment : segments) rows_.push_back(rowOf(segment));
 }
 
 void InputLengths::check(bool again) const {
@@ -19,4 +23,10 @@ void InputLengths::check(bool again) const {
         if (!again) throw Failure(shrank);
         throw InputShrank(shrank, lineOf(Msg::inputShrankTaken, {row.name, left, all}));
     }
+}
+
+void InputLengths::checkUnchanged() const {
+    for (const Row& row : rows_)
+        if (fileBytes(row.name) != row.bytes || modifiedTime(row.name) != row.modified)
+            throw failure(Msg::inputChanged, {row.name});
 }

@@ -27,11 +27,14 @@ class InputLengths {
     // Throws InputShrank, or Failure if the job can't be run again: what a device or a pipe has got can't be
     // taken back.
     void check(bool again) const;
+    // Throws Failure if an input has another length or time than at first.
+    void checkUnchanged() const;
 
   private:
     struct Row {
         std::string name;
-        long long bytes;
+        long long bytes, modified;
     };
+    static Row rowOf(const std::string& name);
     std::vector<Row> rows_;  // of inputs that are files
 };

@@ -20,6 +20,7 @@ struct JobOptions : PlanOptions {
     bool match = false;      // fit what the preset leaves open, and what it can do, to the inputs
     bool dryRun = false, quiet = false;
     bool relative = false;              // the task file has names that count from its folder
+    bool unchanged = false;             // inputs that change meanwhile are failures
     bool strict = false;                // warnings are failures
     std::vector<std::string> warnings;  // of earlier attempts
     double measuredFor = -1;            // seconds that a pass over the sound took before; negative for none

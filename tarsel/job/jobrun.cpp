@@ -156,6 +156,7 @@ void JobRun::checkAndCommit() {
     checkResult(parts_, written_, options_.acceptPartial, warnings_);
     stopIfSignalled();
     if (options_.strict) warnings_.refuse(options_.quiet, plan_.output.name);
+    if (options_.unchanged) lengths_.checkUnchanged();
     parts_.outputs.commit();
 }
 

@@ -22,7 +22,8 @@ const std::set<Msg> kNamesNothing = {
     Msg::outOfMemory,        Msg::engineFailed,     Msg::systemFailed, Msg::inputMissing,
     Msg::captionsCut,        Msg::captionsLate,     Msg::leftRemoved,  Msg::toolHasNoThread,
     Msg::streamNeedsFormat,  Msg::outputMissing,    Msg::stopping,     Msg::stopped,
-    Msg::stoppedWithNothing, Msg::doneUnsaid,
+    Msg::stoppedWithNothing, Msg::doneUnsaid,       Msg::watchStopped, Msg::watchRunCrashed,
+    Msg::watchRunSilent,
     Msg::engineWarns,  // a sentence of the engine
 };
 
