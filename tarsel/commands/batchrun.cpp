@@ -1,8 +1,10 @@
 // tarsel batch LIST run: all tasks that are left, or some of them in this process.
 #include <algorithm>
 #include <climits>
+#include <optional>
 #include <thread>
 
+#include "tarsel/batch/report.h"
 #include "tarsel/batch/runner.h"
 #include "tarsel/batch/taskrun.h"
 #include "tarsel/commands/batchcommands.h"
@@ -25,7 +27,7 @@ constexpr int kMostRetries = 100;
 struct Given {
     OutputOptions outputs;
     ProgressOption progress;
-    std::string jobs, retries, timeout, threads, handed;
+    std::string jobs, retries, timeout, threads, handed, report;
     Words tasks;
     bool stopOnError = false, verify = false, quiet = false;
     bool allowPost = false, acceptPartial = false, strict = false;
@@ -107,7 +109,10 @@ void runAll(const Given& given, const BatchFile& file, const Words& before, Sign
     options.progress = given.progress.mode;
     options.policy = given.outputs.policy();
     options.command = commandOf(given, file, before, options.jobs);
+    std::optional<ReportFile> report;
+    if (!given.report.empty()) report.emplace(given.report, Words{file.name()}, options.policy);
     const BatchResult result = BatchRunner(file, options, signals).run();
+    if (report) report->write(result);
     const auto count = [&](auto... ends) {
         return std::count_if(result.tasks.begin(), result.tasks.end(),
                              [&](const BatchTaskResult& task) { return ((task.end == ends) || ...); });
@@ -140,6 +145,8 @@ void addBatchRun(Command& batch, Signals& signals, const ListName& list, const s
     command.flag("--verify", given->verify, "Know what was done by the bytes of the outputs as well");
     command.list("--task", given->tasks, "Run only this task, in this process", "TASK");
     command.option("--handed", given->handed, "Of the processes of a run: the task is in descriptor 3", "N");
+    command.option("--report", given->report, "Write what became of each task as a page or as JSON",
+                   "FILE.html|.json");
     given->progress.add(command);
     command.flag("--allow-post", given->allowPost, "Run the commands that tasks have for afterwards");
     command.flag("--accept-partial", given->acceptPartial, "Take what is there of damaged inputs");
@@ -153,7 +160,8 @@ void addBatchRun(Command& batch, Signals& signals, const ListName& list, const s
             if (given->tasks.empty() && given->handed.empty()) return runAll(*given, file, before(), signals);
             for (const auto& [value, name] : {std::pair{&given->jobs, "--jobs"},
                                               {&given->retries, "--retry"},
-                                              {&given->timeout, "--timeout"}})
+                                              {&given->timeout, "--timeout"},
+                                              {&given->report, "--report"}})
                 if (!value->empty()) throw failure(Msg::optionsExclude, {"--task", name});
             runTasks(*given, file, signals);
         },

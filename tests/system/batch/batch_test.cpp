@@ -108,6 +108,21 @@ TEST_F(Batch, OutputsThatCollideAreRefused) {
     EXPECT_THAT(status(), HasSubstr("1 task, 1 waiting"));
 }
 
+TEST_F(Batch, TheReportHasEveryTask) {
+    makeWav("<b>.wav", 4000);
+    add({"in.wav", "-o", "a.wav"});
+    add({"<b>.wav", "-o", "b.wav"});
+    remove("<b>.wav");
+    EXPECT_EQ(run({"--report", "r.html"}).status, 1);
+    EXPECT_THAT(contents("r.html"),
+                AllOf(HasSubstr("a.wav"), HasSubstr("&lt;b&gt;.wav"), Not(HasSubstr("<b>.wav"))));
+    EXPECT_EQ(run({"--report", "r.json", "-q"}).status, 1);
+    EXPECT_THAT(contents("r.json"), AllOf(HasSubstr("\"tasks\""), HasSubstr("no such file")));
+    for (const char* name : {"r.txt", "no/r.html", "r.html", "in.wav"})
+        EXPECT_NE(run({"--report", name}).status, 0) << name;
+    fails(2, {"batch", "l.xml", "add", "-", "-o", "c.wav"}, {"standard input"});
+}
+
 TEST_F(Batch, FailuresAreThoseOfOneTask) {
     makeWav("gone.wav", 500);
     add({"gone.wav", "-o", "a.wav"});
