@@ -16,7 +16,7 @@
 #include <unistd.h>
 
 #include "tarsel/host/files.h"
-#include "tarsel/host/outputs/descriptor.h"
+#include "tarsel/host/descriptor.h"
 #include "tarsel/words/messages.h"
 
 namespace fs = std::filesystem;

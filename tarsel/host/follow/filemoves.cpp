@@ -8,7 +8,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include "tarsel/host/outputs/descriptor.h"
+#include "tarsel/host/descriptor.h"
 #include "tarsel/words/messages.h"
 
 namespace fs = std::filesystem;

@@ -4,7 +4,7 @@
 #include <set>
 #include <string>
 
-#include "tarsel/host/outputs/descriptor.h"
+#include "tarsel/host/descriptor.h"
 
 class FolderNotices {
   public:

@@ -4,7 +4,7 @@
 #include <string>
 #include <vector>
 
-#include "tarsel/host/outputs/descriptor.h"
+#include "tarsel/host/descriptor.h"
 
 // Each line has a checksum in front. A line that is torn or damaged is passed over.
 class LockedLines {

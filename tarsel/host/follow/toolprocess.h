@@ -7,7 +7,7 @@
 
 #include <sys/types.h>
 
-#include "tarsel/host/outputs/descriptor.h"
+#include "tarsel/host/descriptor.h"
 
 // It gets SIGTERM when this process ends, however that ends, and no keys or signals of its terminal.
 class ToolProcess {

@@ -4,7 +4,7 @@
 #include <atomic>
 #include <span>
 
-#include "tarsel/host/outputs/descriptor.h"
+#include "tarsel/host/descriptor.h"
 
 class Wake {
   public:
