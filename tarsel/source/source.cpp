@@ -10,6 +10,7 @@
 #include "tarsel/source/captionfile.h"
 #include "tarsel/source/mixfile.h"
 #include "tarsel/source/picturefile.h"
+#include "tarsel/source/viewfile.h"
 #include "tarsel/source/wavformat.h"
 #include "tarsel/words/keyvalues.h"
 #include "tarsel/words/messages.h"
@@ -134,6 +135,10 @@ Source::Source(const std::string& spec, const std::string& raw) : name_(spec) {
         isFile_ = false;
         if (!raw.empty()) throw failure(Msg::rawNoFile, {spec});
         openGenerator(spec);
+    } else if (raw.empty() && isCardFolder(spec)) {
+        decoder_ = openCard(spec);
+        name_ = decoder_->QvCodec::getParam("filename").toString().asString("");
+        files_.push_back(name_);
     } else {
         files_.push_back(spec);
         requireInput(spec);
@@ -289,10 +294,12 @@ void Source::refuseFile(const std::string& decoder) const {
 void Source::takeMixed() {
     requireMixed(name_, *open_);
     for (const std::string& file : mixedFiles(*open_)) files_.push_back(file);
+    for (const std::string& file : inputFilesOf(*open_)) files_.push_back(file);
 }
 
 void Source::openFile() {
-    if (isMixName(name_)) decoder_ = openMix(name_);
+    if (isMixName(name_)) decoder_ = openViews(name_);
+    if (!decoder_ && isMixName(name_)) decoder_ = openMix(name_);
     if (decoder_) return;
     const Any ext = QvFile::getExt(Any(name_.c_str()), true);
     const Any params = openParameters(name_);

@@ -165,6 +165,13 @@ constexpr Message kMessages[] = {
     {Msg::mixWrong,   Exit::usage, "{option}",           "{name} is no channel of a mix",          "give POSITION=FILE, as L=a.wav, L=a.wav:1*0.5 or L=a.wav+b.wav:0.1"},
     {Msg::mixName,    Exit::usage, "can't write {file}", "a mix is a file in .mmf",                "give it a name in .mmf"},
     {Msg::mixNothing, Exit::usage, "{option}",           "without it there is nothing to mix",     "give --ch POSITION=FILE for each channel, or a file in .mmf"},
+    // views and clips
+    {Msg::viewInput,   Exit::input, "can't open {file}",  "{system}",                            "check the files that it names"},
+    {Msg::viewSources, Exit::input, "{option}",           "{system}",                            "'tarsel info' shows what a file holds"},
+    {Msg::viewNone,    Exit::input, "can't open {file}",  "it holds no views",                   "'tarsel views' makes one that does"},
+    {Msg::viewName,    Exit::usage, "can't write {file}", "views are a file in .mmf or .mvf",    "give it a name in .mmf or .mvf"},
+    {Msg::viewNothing, Exit::usage, "{option}",           "without it there is nothing to show", "give --view FILE for each view, or a file in .mmf"},
+    {Msg::cardInput,   Exit::input, "can't open {file}",  "{system}",                            "check the clips of the card"},
     // comparing
     {Msg::compareSizes,       Exit::usage,  "{file} and {file} can't be compared",   "their pictures are {text} and {text}",               "convert one with 'tarsel transcode --size'"},
     {Msg::compareNothing,     Exit::usage,  "{file} and {file} can't be compared",   "no picture of one has a counterpart in the other",   "give another --offset"},

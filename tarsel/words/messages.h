@@ -165,6 +165,13 @@ enum class Msg : unsigned short {
     mixWrong,
     mixName,
     mixNothing,
+    // views and clips
+    viewInput,
+    viewSources,
+    viewNone,
+    viewName,
+    viewNothing,
+    cardInput,
     // comparing
     compareSizes,
     compareNothing,
