@@ -7,6 +7,7 @@
 #include "builtin/creators.h"
 #include "core/arch/qvassert.h"
 #include "core/caption/subtitle/qvsubtitlefilter.h"
+#include "core/compose/qvviewsetup.h"
 #include "core/engine/modules/builtinplugin_p.h"
 #include "core/engine/modules/qvplugin.h"
 
@@ -54,7 +55,7 @@ constexpr QvBuiltinRow registered[] = {
     {"normalizer",   audioFilter,  "Normalize Sound Level",          "Normalizer",                 newNormalizer},
     {"dynamics",     audioFilter,  "Dynamics Processing",            "Dynamics Processing",        newDynamics},
     {"adelay",       audioFilter,  "Audio delay",                    "Audio delay",                newAdelay},
-    {"p2dec",        decoder,      "P2 decoder wrapper",             "P2 decoder wrapper",         nullptr,
+    {"p2dec",        decoder,      "P2 decoder wrapper",             "P2 decoder wrapper",         newP2dec,
      {.exts = "xml", .priority = 9}},
     {"userdata",     videoFilter,  "User data callback filter",      "User data callback filter",  newUserdata},
     {"rawavimux",    muxer,        "Uncompressed AVI muxer",         "AVI Stream",                 newRawavimux},
@@ -62,8 +63,8 @@ constexpr QvBuiltinRow registered[] = {
      {.exts = "wav", .priority = 10}},
     {"aumixdec",     decoder,      "Mixing audio import",            "Mixing audio import",        newAumixdec,
      {.exts = "mmf", .priority = 11}},
-    {"mvprocess",    videoPipe,    "Multi-View process pipeline",    "MV process",                 nullptr},
-    {"mvmetadec",    decoder,      "MV interleaving importer",       "MV import",                  nullptr,
+    {"mvprocess",    videoPipe,    "Multi-View process pipeline",    "MV process",                 newMvprocess},
+    {"mvmetadec",    decoder,      "MV interleaving importer",       "MV import",                  newMvmetadec,
      {.exts = "mmf mvf", .priority = 10}},
     {"memmux",       muxer,        "Memory buffer 'multiplexer'",    "Stream output",              newMemmux,
      {.internal = true}},
@@ -101,6 +102,7 @@ const QvBuiltinRow& qvBuiltinRow(const char* name) {
 
 QvPlugin* qvBuiltinPlugin() {
     static QvPlugin plugin("builtin", "Builtin modules");
+    QvViewSetup::registerElement();
     if (plugin.nrModules() == 0) addModules(plugin);
     return &plugin;
 }

@@ -109,6 +109,7 @@ int run(int argc, char** argv) {
     addInfo(line);
     addLoudness(line);
     addMix(line, signals);
+    addViews(line, signals);
     addCaptions(line, signals);
     addFrame(line, signals, version);
     addCompare(line, signals);

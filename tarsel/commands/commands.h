@@ -13,6 +13,7 @@ void addTranscode(CommandLine& line, Signals& signals, const std::string& versio
 void addInfo(CommandLine& line);
 void addLoudness(CommandLine& line);
 void addMix(CommandLine& line, Signals& signals);
+void addViews(CommandLine& line, Signals& signals);
 void addCaptions(CommandLine& line, Signals& signals);
 void addModules(CommandLine& line);
 void addFormats(CommandLine& line);

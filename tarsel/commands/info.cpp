@@ -216,14 +216,14 @@ void printFile(const Json& file) {
     if (file.contains("damage")) print("  damaged   %s\n", file["damage"].get<std::string>().c_str());
 }
 
-// An installation may have a decoder for other XML files; no installation has one for tasks.
+// Decoders of other XML files refuse those that they don't know.
 bool isTaskFile(const std::string& name) {
     const Any extension = QvFile::getExt(Any(name.c_str()), true);
     if (!(extension == "xml")) return false;
-    const AnyVector decoders = qv_registry()->decoders("xml");
-    return std::none_of(decoders.begin(), decoders.end(), [](const Any& decoder) {
-        return std::unique_ptr<QvCodec>(qv_registry()->newCodec(decoder.asString())) != nullptr;
-    });
+    const std::unique_ptr<QvCodec> clip(qv_registry()->newCodec("p2dec"));
+    if (!clip) return true;
+    clip->setParam("filename", name.c_str());
+    return clip->open() != QvStatus::ok && clip->QvCodec::getParam("foreign").isTrue();
 }
 
 Json showTask(const std::string& name, bool json) {

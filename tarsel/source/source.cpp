@@ -11,6 +11,7 @@
 #include "tarsel/source/captionfile.h"
 #include "tarsel/source/mixfile.h"
 #include "tarsel/source/picturefile.h"
+#include "tarsel/source/viewfile.h"
 #include "tarsel/source/wavformat.h"
 #include "tarsel/words/keyvalues.h"
 #include "tarsel/words/messages.h"
@@ -139,6 +140,10 @@ Source::Source(const std::string& spec, const std::string& raw, StandardInput* s
     } else if (spec == StandardInput::kName) {
         takeStandard(standard, !raw.empty());
         raw.empty() ? openFile() : openRaw(raw);
+    } else if (raw.empty() && isCardFolder(spec)) {
+        decoder_ = openCard(spec);
+        name_ = decoder_->QvCodec::getParam("filename").toString().asString("");
+        files_.push_back(name_);
     } else {
         files_.push_back(spec);
         requireInput(spec);
@@ -319,10 +324,12 @@ void Source::refuseFile(const std::string& decoder, const std::string& reason) c
 void Source::takeMixed() {
     requireMixed(name_, *open_);
     for (const std::string& file : mixedFiles(*open_)) files_.push_back(file);
+    for (const std::string& file : inputFilesOf(*open_)) files_.push_back(file);
 }
 
 void Source::openFile() {
-    if (isMixName(formatName_)) decoder_ = openMix(name_);
+    if (isMixName(formatName_)) decoder_ = openViews(name_);
+    if (!decoder_ && isMixName(formatName_)) decoder_ = openMix(name_);
     if (decoder_) return;
     const Any params = openParameters(formatName_);
     Any error;

@@ -178,6 +178,13 @@ enum class Msg : unsigned short {
     stdinIsTerminal,
     stdinNotKept,
     stdinNoSpace,
+    // views and clips
+    viewInput,
+    viewSources,
+    viewNone,
+    viewName,
+    viewNothing,
+    cardInput,
     // comparing
     compareSizes,
     compareNothing,

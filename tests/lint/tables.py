@@ -57,7 +57,8 @@ def modules_page(modules):
             if read := [f"`{p['name']}`" for p in m["parameters"] if p["read_only"]]:
                 page.append(f"To read: {', '.join(read)}.\n")
     unusable = ", ".join(f"`{m['name']}`" for m in modules if not m["usable"])
-    page.append(f"## Not usable yet\n\n{unusable}.\n")
+    if unusable:
+        page.append(f"## Not usable yet\n\n{unusable}.\n")
     return re.sub(r"\n## [^\n]+\n\n(?=\n?## )", "\n", "\n".join(page))
 
 

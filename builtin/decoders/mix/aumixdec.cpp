@@ -5,7 +5,7 @@
 
 #include "builtin/creators.h"
 #include "builtin/decoders/mix/interleave.h"
-#include "builtin/decoders/mix/mixnesting.h"
+#include "builtin/shared/inputnesting.h"
 #include "core/arch/qvassert.h"
 #include "core/compose/qvmetafile.h"
 #include "core/engine/log/qvlog.h"
@@ -123,9 +123,9 @@ int AudioMixDec::open() {
         setError(QvStatus::illegalState, "open: open parameters not defined");
         QV_FAIL(errorDesc());
     }
-    const MixNesting nesting(filename_);
-    const auto failed = [this, &nesting](int code) {
-        nesting.failed(inputFailure_);
+    const InputNesting nesting(filename_);
+    const auto failed = [this](int code) {
+        InputNesting::noteFailure(inputFailure_);
         return code;
     };
     if (!nesting.fault().empty()) {

@@ -3,7 +3,7 @@
 #include <algorithm>
 
 #include "builtin/decoders/mix/adecstream.h"
-#include "builtin/decoders/mix/mixnesting.h"
+#include "builtin/shared/inputnesting.h"
 #include "core/arch/qvassert.h"
 #include "core/decode/decodefactory.h"
 #include "core/engine/files/qvfileutil.h"
@@ -19,20 +19,6 @@ constexpr int mixBits = 32;
 constexpr const char* mixedCodec = "PCM";
 
 std::string shown(const Any& text) { return text.toString().asString(""); }
-
-// Keeps what the factory said last of a file that it could not open.
-struct Reason : QvFileOpenCb {
-    std::string text;
-    int fileOpenFinished(int result, QvFileOpenCbData& data) override {
-        if (result != QvStatus::ok) text = shown(data.text);
-        return QvStatus::ok;
-    }
-};
-
-// Why the inputs of an open decoder can't be read, if it has inputs.
-std::string failureIn(const QvDecodePipe& decoder) {
-    return shown(decoder.QvCodec::getParam("inputFailure"));
-}
 
 }  // namespace
 
@@ -79,28 +65,22 @@ int Interleave::prepare(int targetRate, const AnyDict& inputParams) {
 
 std::unique_ptr<QvDecodePipe> Interleave::openDecoder(int file, const Any* params) {
     const Any name = setup.inFileName(file);
-    Reason reason;
-    std::unique_ptr<QvDecodePipe> decoder;
-    MixNesting::takeFailure();
-    if (!MixNesting::addInput()) {
-        reason.text = "more than " + std::to_string(MixNesting::maxInputs) + " inputs";
-    } else if (QvFile::isFile(name) && QvFile::flength(name) < 0) {
-        // Opening a pipe would wait for its writer.
-        reason.text = "it can't be read, or is no regular file";
-    } else if (const char* module = setup.decoder(file)) {
-        qv_dbg()->info("Using decoder '%s' to open %s", module, shown(name).c_str());
-        decoder.reset(QvDecFactory::decodePipeUsing(name, AnyVector(Any(module)), Any(), &reason, params));
-    } else {
-        decoder.reset(QvDecFactory::decodePipe(name, Any(), &reason, params));
-    }
-    if (decoder) reason.text = failureIn(*decoder);
-    if (decoder && reason.text.empty() && decoder->nrStreams(qvAudioStream) == 0)
-        reason.text = "it has no sound";
-    if (decoder && reason.text.empty()) return decoder;
-
-    if (const std::string inner = MixNesting::takeFailure(); !decoder && !inner.empty()) reason.text = inner;
-    if (!QvFile::isFile(name)) reason.text = "there is no such file";
-    inputFailure_ = "input '" + shown(name) + "': " + reason.text;
+    std::string reason;
+    auto decoder = InputNesting::open(
+        name,
+        [&](QvFileOpenCb* callback) {
+            const char* module = setup.decoder(file);
+            if (!module) return QvDecFactory::decodePipe(name, Any(), callback, params);
+            qv_dbg()->info("Using decoder '%s' to open %s", module, shown(name).c_str());
+            return QvDecFactory::decodePipeUsing(name, AnyVector(Any(module)), Any(), callback, params);
+        },
+        reason);
+    if (decoder && decoder->nrStreams(qvAudioStream) == 0)
+        reason = "it has no sound";
+    else if (decoder)
+        return decoder;
+    if (!QvFile::isFile(name)) reason = "there is no such file";
+    inputFailure_ = "input '" + shown(name) + "': " + reason;
     qv_log()->error("[mixadec] Failed to open input file %s", shown(name).c_str());
     return nullptr;
 }

@@ -20,4 +20,8 @@ void qvSetTotalFrames(QvVProcessPipe& pipe, long long in, long long out) {
         total *= factor(i);
         later /= factor(i);
     }
+    AnyVector both;
+    both.append(Any(in));
+    both.append(Any(out));
+    qvSetOptionalParam(pipe, qvTotalFramesOfViews, both);
 }

@@ -3,7 +3,7 @@
 
 #include <cmath>
 
-#include "builtin/decoders/mix/mixnesting.h"
+#include "builtin/shared/inputnesting.h"
 #include "core/compose/qvaudiomixdecsetup.h"
 #include "core/decode/decodefactory.h"
 #include "core/engine/modules/qvregistry.h"
@@ -288,17 +288,17 @@ TEST_F(AuMixDec, WhatCantBeMixedIsRefused) {
 TEST_F(AuMixDec, MixesOfMixesAreFinite) {
     makeWav("a.wav", 100);
     document("0.mmf", "<src file='a.wav' channel='0' gain='0.5'/>");
-    for (int i = 1; i <= MixNesting::maxDepth; ++i)
+    for (int i = 1; i <= InputNesting::maxDepth; ++i)
         document(std::to_string(i) + ".mmf", "<src file='" + std::to_string(i - 1) + ".mmf' channel='0'/>");
     const Pipe inner = openFile(folder.file("0.mmf"));
-    const Pipe deepest = openFile(folder.file(std::to_string(MixNesting::maxDepth - 1) + ".mmf"));
+    const Pipe deepest = openFile(folder.file(std::to_string(InputNesting::maxDepth - 1) + ".mmf"));
     ASSERT_TRUE(inner && deepest);
     EXPECT_EQ(failureIn(*deepest), "");
     Values wanted = readAll(*inner, 64), got = readAll(*deepest, 64);
     wanted.resize(100);
     got.resize(100);
     EXPECT_EQ(got, wanted);
-    const Pipe tooDeep = openFile(folder.file(std::to_string(MixNesting::maxDepth) + ".mmf"));
+    const Pipe tooDeep = openFile(folder.file(std::to_string(InputNesting::maxDepth) + ".mmf"));
     ASSERT_TRUE(tooDeep);
     EXPECT_NE(failureIn(*tooDeep).find("more than 8 metafiles inside one another"), std::string::npos)
         << failureIn(*tooDeep);
@@ -309,7 +309,7 @@ TEST_F(AuMixDec, MixesOfMixesAreFinite) {
     EXPECT_NE(failureIn(*self).find("it is an input of itself"), std::string::npos) << failureIn(*self);
 
     std::string many;
-    for (int i = 0; i <= MixNesting::maxInputs; ++i) {
+    for (int i = 0; i <= InputNesting::maxInputs; ++i) {
         const std::string name = "link" + std::to_string(i) + ".wav";
         std::filesystem::create_symlink(folder.file("a.wav"), folder.file(name));
         many += "<src file='" + name + "' channel='0'/>";
