@@ -46,7 +46,7 @@ QvViewSetup setupGiven(const Given& given) {
         bool isNone = false;
         const std::string fault = setup.load(Any(given.file.c_str()), &isNone);
         if (isNone) throw failure(Msg::viewNone, {given.file});
-        if (!fault.empty()) throw failure(Msg::viewInput, {given.file, fault});
+        if (!fault.empty()) throw failure(Msg::mixInput, {given.file, fault});
     }
     for (const std::string& name : given.views) setup.views.push_back(viewOf(name, given.raw));
     if (!given.layout.empty()) QvViewSetup::findLayout(given.layout, setup.layout);

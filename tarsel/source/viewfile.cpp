@@ -29,10 +29,10 @@ std::unique_ptr<QvDecodePipe> openViews(const std::string& name) {
     bool isNone = false;
     const std::string fault = setup.load(Any(name.c_str()), &isNone);
     if (isNone) return nullptr;
-    if (!fault.empty()) throw failure(Msg::viewInput, {name, fault});
+    if (!fault.empty()) throw failure(Msg::mixInput, {name, fault});
     auto decoder = makeViews();
     decoder->setParam("filename", name.c_str());
-    if (decoder->open() != QvStatus::ok) throw failure(Msg::viewInput, {name, decoder->errorDesc()});
+    if (decoder->open() != QvStatus::ok) throw failure(Msg::mixInput, {name, decoder->errorDesc()});
     return decoder;
 }
 
@@ -41,7 +41,7 @@ std::unique_ptr<QvDecodePipe> openViews(const std::string& option, const QvViewS
     setup.store(state);
     auto decoder = makeViews();
     decoder->setParam("metaState", state);
-    if (decoder->open() != QvStatus::ok) throw failure(Msg::viewSources, {option, decoder->errorDesc()});
+    if (decoder->open() != QvStatus::ok) throw failure(Msg::mixSources, {option, decoder->errorDesc()});
     return decoder;
 }
 

@@ -179,8 +179,6 @@ constexpr Message kMessages[] = {
     {Msg::stdinNotKept,    Exit::output, "can't keep the standard input in {file}", "{text}",                                                         "{text}"},
     {Msg::stdinNoSpace,    Exit::output, "can't keep the standard input in {file}", "{text} are free there",                                          "make room, or name another folder in TMPDIR"},
     // views and clips
-    {Msg::viewInput,   Exit::input, "can't open {file}",  "{system}",                            "check the files that it names"},
-    {Msg::viewSources, Exit::input, "{option}",           "{system}",                            "'tarsel info' shows what a file holds"},
     {Msg::viewNone,    Exit::input, "can't open {file}",  "it holds no views",                   "'tarsel views' makes one that does"},
     {Msg::viewName,    Exit::usage, "can't write {file}", "views are a file in .mmf or .mvf",    "give it a name in .mmf or .mvf"},
     {Msg::viewNothing, Exit::usage, "{option}",           "without it there is nothing to show", "give --view FILE for each view, or a file in .mmf"},

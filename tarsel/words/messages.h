@@ -179,8 +179,6 @@ enum class Msg : unsigned short {
     stdinNotKept,
     stdinNoSpace,
     // views and clips
-    viewInput,
-    viewSources,
     viewNone,
     viewName,
     viewNothing,
