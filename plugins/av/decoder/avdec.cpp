@@ -185,8 +185,8 @@ void AvDec::addStreams(MediaInput& input, std::string& reason) {
             const AVStream& stream = *container.streams[i];
             if (stream.codecpar->codec_type != AVMEDIA_TYPE_VIDEO || isCover(stream) != covers) continue;
             std::string why;
-            auto reader = PictureReader::open(*bytes_, settings_.container, static_cast<int>(i), index_,
-                                              settings_.threads, why);
+            auto reader = FrameReader::open(*bytes_, settings_.container, static_cast<int>(i), index_,
+                                            settings_.threads, why);
             if (!reader) {
                 leaveOut(i, why);
                 continue;

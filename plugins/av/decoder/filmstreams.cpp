@@ -24,7 +24,7 @@ void describeStream(const AVStream& stream, AnyDict& params) {
     if (stream.id > 0) params.set("codecParams", AnyDict("pid", stream.id));
 }
 
-PictureStream::PictureStream(std::unique_ptr<PictureReader> reader, const AVStream& stream)
+PictureStream::PictureStream(std::unique_ptr<FrameReader> reader, const AVStream& stream)
     : reader_(std::move(reader)) {
     const PictureFormat& format = reader_->format();
     params.set("FOURCC", format.fourcc);
@@ -50,9 +50,9 @@ PictureStream::PictureStream(std::unique_ptr<PictureReader> reader, const AVStre
 
 int PictureStream::read() {
     switch (reader_->read()) {
-        case PictureReader::Read::end: return QvStatus::endOfStream;
-        case PictureReader::Read::failed: return QvStatus::cannotParse;
-        case PictureReader::Read::picture: break;
+        case FrameReader::Read::end: return QvStatus::endOfStream;
+        case FrameReader::Read::failed: return QvStatus::cannotParse;
+        case FrameReader::Read::picture: break;
     }
     if (reader_->concealed() != concealed_) {
         concealed_ = reader_->concealed();

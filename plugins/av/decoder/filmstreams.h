@@ -6,7 +6,7 @@
 
 #include "core/decode/basedecodepipe.h"
 #include "core/media/qvbuffer.h"
-#include "plugins/av/picture/picturereader.h"
+#include "plugins/av/picture/framereader.h"
 #include "plugins/av/sound/samplereader.h"
 
 struct AVStream;
@@ -18,18 +18,18 @@ void describeStream(const AVStream& stream, AnyDict& params);
 
 class PictureStream : public DPipeVideoStream {
   public:
-    PictureStream(std::unique_ptr<PictureReader> reader, const AVStream& stream);
+    PictureStream(std::unique_ptr<FrameReader> reader, const AVStream& stream);
 
     int read();  // as readFrame
     bool seek(long long frame) {
         return frame >= 0 && frame <= reader_->format().frames && reader_->seek(static_cast<int>(frame));
     }
-    PictureReader& reader() { return *reader_; }
+    FrameReader& reader() { return *reader_; }
     // The file was cut, or is damaged. Nothing changes if it has what it announces all the same.
     void setTruncated(long long expected);
 
   private:
-    std::unique_ptr<PictureReader> reader_;
+    std::unique_ptr<FrameReader> reader_;
     int concealed_ = 0;
 };
 

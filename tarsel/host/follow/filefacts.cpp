@@ -15,8 +15,8 @@
 #include <sys/vfs.h>
 #include <unistd.h>
 
-#include "tarsel/host/files.h"
 #include "tarsel/host/descriptor.h"
+#include "tarsel/host/files.h"
 #include "tarsel/words/messages.h"
 
 namespace fs = std::filesystem;

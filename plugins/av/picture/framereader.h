@@ -34,15 +34,15 @@ struct PictureFormat {
     double bitrate = 0;  // bits a second; 0: unknown
 };
 
-class PictureReader {
+class FrameReader {
   public:
     // `threads` of the codec; 0: one a core.
-    static std::unique_ptr<PictureReader> open(const MediaBytes& bytes, const std::string& format, int stream,
-                                               std::shared_ptr<const PacketIndex> index, int threads,
-                                               std::string& reason);
-    ~PictureReader();
-    PictureReader(const PictureReader&) = delete;
-    PictureReader& operator=(const PictureReader&) = delete;
+    static std::unique_ptr<FrameReader> open(const MediaBytes& bytes, const std::string& format, int stream,
+                                             std::shared_ptr<const PacketIndex> index, int threads,
+                                             std::string& reason);
+    ~FrameReader();
+    FrameReader(const FrameReader&) = delete;
+    FrameReader& operator=(const FrameReader&) = delete;
 
     const PictureFormat& format() const { return format_; }
     // The time of picture 0, as `zero` units of a second divided by `zeroBase`: where sound starts, too.
@@ -67,7 +67,7 @@ class PictureReader {
     std::string failure_;
     int next_ = 0;  // picture
 
-    PictureReader();
+    FrameReader();
     bool describe();
 };
 

@@ -1,4 +1,4 @@
-#include "plugins/av/picture/picturereader.h"
+#include "plugins/av/picture/framereader.h"
 
 #include <algorithm>
 #include <optional>
@@ -34,7 +34,7 @@ Rational rational(AVRational r) { return {r.num, r.den}; }
 }  // namespace
 
 // Presentation numbers count the pictures that are shown; packets those of the index.
-class PictureReader::Decoding {
+class FrameReader::Decoding {
   public:
     explicit Decoding(std::unique_ptr<DecodedPictures> source)
         : source_(std::move(source)), held_(av_frame_alloc()), coming_(av_frame_alloc()) {}
@@ -84,7 +84,7 @@ class PictureReader::Decoding {
     bool hasTimes() const;
 };
 
-bool PictureReader::Decoding::hasTimes() const {
+bool FrameReader::Decoding::hasTimes() const {
     const AVCodecDescriptor* const codec = avcodec_descriptor_get(source_->codec().codec_id);
     if (!codec || !(codec->props & AV_CODEC_PROP_REORDER)) return true;
     const auto& packets = source_->packets();
@@ -97,7 +97,7 @@ bool PictureReader::Decoding::hasTimes() const {
 }
 
 // Without times only the codec knows the order of presentation: it decodes the stream once.
-bool PictureReader::Decoding::decodeOrder(std::string& reason) {
+bool FrameReader::Decoding::decodeOrder(std::string& reason) {
     pictures_.clear();
     while (true) {
         switch (source_->next(*coming_)) {
@@ -111,7 +111,7 @@ bool PictureReader::Decoding::decodeOrder(std::string& reason) {
     }
 }
 
-bool PictureReader::Decoding::isSecondField(std::size_t packet) const {
+bool FrameReader::Decoding::isSecondField(std::size_t packet) const {
     const auto& packets = source_->packets();
     if (packet == 0 || packets[packet].position >= 0 || packets[packet - 1].position < 0) return false;
     return packets[packet].pts == packets[packet - 1].pts + packets[packet - 1].duration;
@@ -119,7 +119,7 @@ bool PictureReader::Decoding::isSecondField(std::size_t packet) const {
 
 // In transport streams the two fields of a picture are packets of their own, the second without a place. The
 // first pictures show whether it is so here.
-bool PictureReader::Decoding::dropSecondFields() {
+bool FrameReader::Decoding::dropSecondFields() {
     constexpr int enough = 8;
     const AVFieldOrder order = source_->stream().codecpar->field_order;
     if (source_->codec().codec_id != AV_CODEC_ID_H264 || order == AV_FIELD_PROGRESSIVE) return true;
@@ -134,13 +134,13 @@ bool PictureReader::Decoding::dropSecondFields() {
     return source_->seek(0);
 }
 
-void PictureReader::Decoding::numberPackets() {
+void FrameReader::Decoding::numberPackets() {
     number_.assign(source_->packets().size(), notShown);
     for (std::size_t i = 0; i < pictures_.size(); ++i) number_[pictures_[i].packet] = i;
 }
 
 // Pictures before the first one that comes can't be decoded: they need pictures that are not in the file.
-bool PictureReader::Decoding::findFirst(std::string& reason) {
+bool FrameReader::Decoding::findFirst(std::string& reason) {
     while (!comingNumber_ && !ended_) {
         if (pull(reason) == Read::failed) return false;
         if (source_->position() > static_cast<std::size_t>(limits::silentPackets)) break;
@@ -155,7 +155,7 @@ bool PictureReader::Decoding::findFirst(std::string& reason) {
     return true;
 }
 
-bool PictureReader::Decoding::begin(std::string& reason) {
+bool FrameReader::Decoding::begin(std::string& reason) {
     if (!held_ || !coming_) {
         reason = "out of memory";
         return false;
@@ -196,14 +196,14 @@ bool PictureReader::Decoding::begin(std::string& reason) {
     return true;
 }
 
-void PictureReader::Decoding::conceal(std::size_t number) {
+void FrameReader::Decoding::conceal(std::size_t number) {
     if (counted_[number]) return;
     counted_[number] = true;
     ++concealed_;
 }
 
 // The next picture that is presented into coming_.
-PictureReader::Read PictureReader::Decoding::pull(std::string& failure) {
+FrameReader::Read FrameReader::Decoding::pull(std::string& failure) {
     comingNumber_.reset();
     while (!ended_) {
         switch (source_->next(*coming_)) {
@@ -225,7 +225,7 @@ PictureReader::Read PictureReader::Decoding::pull(std::string& failure) {
 // The last packet at or before the picture's own from which it can be decoded as from the start: a key
 // picture that is presented before it. Pictures after a key picture that are presented before it refer to
 // what precedes it.
-std::size_t PictureReader::Decoding::startFor(std::size_t wanted) const {
+std::size_t FrameReader::Decoding::startFor(std::size_t wanted) const {
     const auto& packets = source_->packets();
     for (std::size_t i = pictures_[wanted].packet; i > 0; --i)
         if (packets[i].key() && !noStart_[i] && number_[i] != notShown && number_[i] <= wanted) return i;
@@ -233,7 +233,7 @@ std::size_t PictureReader::Decoding::startFor(std::size_t wanted) const {
 }
 
 // Makes the pictures that come next reach the wanted one: goes on from here, or starts at a key picture.
-bool PictureReader::Decoding::reach(std::size_t wanted, std::string& failure) {
+bool FrameReader::Decoding::reach(std::size_t wanted, std::string& failure) {
     const std::size_t start = startFor(wanted);
     const bool ahead = (heldNumber_ && *heldNumber_ <= wanted) || (comingNumber_ && *comingNumber_ <= wanted);
     if (ahead && start <= source_->position()) return true;
@@ -247,7 +247,7 @@ bool PictureReader::Decoding::reach(std::size_t wanted, std::string& failure) {
     return false;
 }
 
-PictureReader::Read PictureReader::Decoding::show(std::size_t wanted, std::string& failure) {
+FrameReader::Read FrameReader::Decoding::show(std::size_t wanted, std::string& failure) {
     if (heldNumber_ == wanted) return Read::picture;
     if (!reach(wanted, failure)) return Read::failed;
     for (;;) {
@@ -278,7 +278,7 @@ PictureReader::Read PictureReader::Decoding::show(std::size_t wanted, std::strin
     return Read::failed;
 }
 
-void PictureReader::Decoding::describe(PictureFormat& format) {
+void FrameReader::Decoding::describe(PictureFormat& format) {
     const AVFrame& first = *coming_;
     const AVStream& stream = source_->stream();
     format.width = first.width;
@@ -298,15 +298,15 @@ void PictureReader::Decoding::describe(PictureFormat& format) {
     format.bitrate = static_cast<double>(stream.codecpar->bit_rate);
 }
 
-PictureReader::PictureReader() = default;
-PictureReader::~PictureReader() = default;
+FrameReader::FrameReader() = default;
+FrameReader::~FrameReader() = default;
 
-int PictureReader::concealed() const { return decoding_->concealed(); }
+int FrameReader::concealed() const { return decoding_->concealed(); }
 
-std::unique_ptr<PictureReader> PictureReader::open(const MediaBytes& bytes, const std::string& format,
-                                                   int stream, std::shared_ptr<const PacketIndex> index,
-                                                   int threads, std::string& reason) {
-    std::unique_ptr<PictureReader> reader(new PictureReader);
+std::unique_ptr<FrameReader> FrameReader::open(const MediaBytes& bytes, const std::string& format, int stream,
+                                               std::shared_ptr<const PacketIndex> index, int threads,
+                                               std::string& reason) {
+    std::unique_ptr<FrameReader> reader(new FrameReader);
     auto source = DecodedPictures::open(bytes, format, stream, std::move(index), threads, reason);
     if (!source) return nullptr;
     reader->decoding_ = std::make_unique<Decoding>(std::move(source));
@@ -318,7 +318,7 @@ std::unique_ptr<PictureReader> PictureReader::open(const MediaBytes& bytes, cons
     return reader;
 }
 
-bool PictureReader::describe() {
+bool FrameReader::describe() {
     Decoding& decoding = *decoding_;
     decoding.describe(format_);
     const AVFrame& first = decoding.first();
@@ -342,13 +342,13 @@ bool PictureReader::describe() {
     return true;
 }
 
-bool PictureReader::seek(int n) {
+bool FrameReader::seek(int n) {
     if (n < 0 || n > format_.frames) return false;
     next_ = n;
     return true;
 }
 
-PictureReader::Read PictureReader::read() {
+FrameReader::Read FrameReader::read() {
     if (next_ >= format_.frames) return Read::end;
     const auto& shown = decoding_->plan().shown;
     const auto n = static_cast<std::size_t>(next_);

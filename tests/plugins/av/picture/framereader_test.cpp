@@ -1,4 +1,4 @@
-#include "plugins/av/picture/picturereader.h"
+#include "plugins/av/picture/framereader.h"
 
 #include <cstring>
 #include <random>
@@ -10,7 +10,7 @@
 
 namespace {
 
-using av::PictureReader;
+using av::FrameReader;
 
 // The planes without padding; words moved back to the low bits.
 std::string bytesOf(const QvFrame& frame, int shift) {
@@ -31,9 +31,9 @@ std::string bytesOf(const QvFrame& frame, int shift) {
     return bytes;
 }
 
-class PictureReaderOfFilms : public Films {
+class FrameReaderOfFilms : public Films {
   protected:
-    std::unique_ptr<PictureReader> open(const std::string& film, int threads = 2) {
+    std::unique_ptr<FrameReader> open(const std::string& film, int threads = 2) {
         bytes_ = std::make_unique<av::MediaBytes>(Any(film.c_str()));
         std::string reason;
         const auto input = av::MediaInput::open(*bytes_, "", reason);
@@ -41,7 +41,7 @@ class PictureReaderOfFilms : public Films {
         if (!input) return nullptr;
         const std::shared_ptr<const av::PacketIndex> index = av::PacketIndex::build(*input, reason);
         EXPECT_TRUE(index) << reason;
-        auto reader = index ? PictureReader::open(*bytes_, "", 0, index, threads, reason) : nullptr;
+        auto reader = index ? FrameReader::open(*bytes_, "", 0, index, threads, reason) : nullptr;
         EXPECT_TRUE(reader) << reason;
         return reader;
     }
@@ -56,13 +56,13 @@ class PictureReaderOfFilms : public Films {
         const std::size_t size = expected.size() / static_cast<std::size_t>(frames);
         ASSERT_EQ(size * static_cast<std::size_t>(frames), expected.size());
         const auto same = [&](int n) {
-            if (reader->read() != PictureReader::Read::picture || reader->frame().frameNr != n) return false;
+            if (reader->read() != FrameReader::Read::picture || reader->frame().frameNr != n) return false;
             const std::string bytes = bytesOf(reader->frame(), shift);
             return bytes.size() == size &&
                    std::memcmp(bytes.data(), expected.data() + size * static_cast<std::size_t>(n), size) == 0;
         };
         for (int n = 0; n < frames; ++n) ASSERT_TRUE(same(n)) << "picture " << n;
-        EXPECT_EQ(reader->read(), PictureReader::Read::end);
+        EXPECT_EQ(reader->read(), FrameReader::Read::end);
         std::mt19937 random(1);
         for (int i = 0; i < 40; ++i) {
             const int n = static_cast<int>(random() % static_cast<unsigned>(frames));
@@ -76,7 +76,7 @@ class PictureReaderOfFilms : public Films {
     std::unique_ptr<av::MediaBytes> bytes_;
 };
 
-TEST_F(PictureReaderOfFilms, everyPictureIsTheSameInOrderAndAfterSeeks) {
+TEST_F(FrameReaderOfFilms, everyPictureIsTheSameInOrderAndAfterSeeks) {
     const struct {
         const char* name;
         Words options;
@@ -103,14 +103,14 @@ TEST_F(PictureReaderOfFilms, everyPictureIsTheSameInOrderAndAfterSeeks) {
     }
 }
 
-TEST_F(PictureReaderOfFilms, anEditListDecidesWhatIsThere) {
+TEST_F(FrameReaderOfFilms, anEditListDecidesWhatIsThere) {
     film("whole.mp4", {"-c:v", "mpeg4", "-g", "25", "-bf", "2"});
     const std::string cut = folder.file("cut.mp4");
     ASSERT_EQ(ffmpeg({"-ss", "0.4", "-i", folder.file("whole.mp4"), "-c", "copy", cut}).status, 0);
     compare(cut, "yuv420p", 0, 40);
 }
 
-TEST_F(PictureReaderOfFilms, aVariableRateBecomesAUsualOne) {
+TEST_F(FrameReaderOfFilms, aVariableRateBecomesAUsualOne) {
     // Pictures 10 to 19 are not there: the one before them stays.
     const std::string file = film("gap.mkv", {"-vf", "select=not(between(n\\,10\\,19))", "-fps_mode",
                                               "passthrough", "-c:v", "ffv1", "-pix_fmt", "yuv420p"});
@@ -121,7 +121,7 @@ TEST_F(PictureReaderOfFilms, aVariableRateBecomesAUsualOne) {
     const std::string expected = pictures(file, "yuv420p");
     const std::size_t size = expected.size() / 40;
     for (int n = 0; n < reader->format().frames; ++n) {
-        ASSERT_EQ(reader->read(), PictureReader::Read::picture);
+        ASSERT_EQ(reader->read(), FrameReader::Read::picture);
         const int due = (n * 1001 + 24) / (24 * 40);  // of the source, whose pictures last 40 ms
         const int shown = due < 10 ? due : due < 20 ? 9 : due - 10;
         EXPECT_TRUE(bytesOf(reader->frame(), 0) ==
@@ -131,7 +131,7 @@ TEST_F(PictureReaderOfFilms, aVariableRateBecomesAUsualOne) {
     EXPECT_EQ(reader->format().frames, 48);
 }
 
-TEST_F(PictureReaderOfFilms, aHoleInTheFileIsCountedAndTheRestIsExact) {
+TEST_F(FrameReaderOfFilms, aHoleInTheFileIsCountedAndTheRestIsExact) {
     const std::string file = film("hole.mkv", {"-c:v", "mpeg2video", "-g", "1", "-q:v", "2"});
     const auto whole = open(file);
     ASSERT_TRUE(whole);
@@ -150,8 +150,8 @@ TEST_F(PictureReaderOfFilms, aHoleInTheFileIsCountedAndTheRestIsExact) {
     ASSERT_EQ(damaged->format().frames, frames);
     int different = 0;
     for (int n = 0; n < frames; ++n) {
-        ASSERT_EQ(whole->read(), PictureReader::Read::picture);
-        ASSERT_EQ(damaged->read(), PictureReader::Read::picture);
+        ASSERT_EQ(whole->read(), FrameReader::Read::picture);
+        ASSERT_EQ(damaged->read(), FrameReader::Read::picture);
         different += bytesOf(whole->frame(), 0) != bytesOf(damaged->frame(), 0);
     }
     EXPECT_EQ(different, 1);
