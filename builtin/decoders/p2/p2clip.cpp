@@ -199,7 +199,7 @@ P2Fault p2FindDocument(const Any& name, Any& document) {
     }
     // Those that begin a take, as far as it is here.
     std::erase_if(clips,
-                  [&](const P2Clip& clip) { return clip.previousId != "" && ids.count(clip.previousId); });
+                  [&](const P2Clip& clip) { return !clip.previousId.empty() && ids.count(clip.previousId); });
     if (clips.empty()) return {"the folder holds no P2 clip", true};
     document = clips.front().document;
     if (clips.size() == 1) return {};
@@ -214,10 +214,10 @@ P2Fault p2ReadTake(const Any& document, bool join, std::vector<P2Clip>& parts) {
     parts.clear();
     P2Clip clip;
     if (P2Fault fault = readDocument(document, clip); !fault.empty()) return fault;
-    if (join && (clip.previousId != "" || clip.nextId != "")) {
+    if (join && (!clip.previousId.empty() || !clip.nextId.empty())) {
         const ClipIndex index(clip);
         std::set<std::string> seen{clip.id};
-        while (clip.previousId != "") {
+        while (!clip.previousId.empty()) {
             const P2Clip* before = index.find(clip.previousId);
             if (!before) return missingPart("before", clip);
             if (!seen.insert(before->id).second) return {"the parts of its take go round in a circle"};
@@ -225,7 +225,7 @@ P2Fault p2ReadTake(const Any& document, bool join, std::vector<P2Clip>& parts) {
         }
         seen = {clip.id};
         parts.push_back(clip);
-        while (parts.back().nextId != "") {
+        while (!parts.back().nextId.empty()) {
             const P2Clip* next = index.find(parts.back().nextId);
             if (!next) return missingPart("after", parts.back());
             if (!seen.insert(next->id).second) return {"the parts of its take go round in a circle"};
