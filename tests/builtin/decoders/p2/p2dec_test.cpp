@@ -19,8 +19,8 @@ using testing::HasSubstr;
 
 class P2 : public testing::Test {
   protected:
+    QvPlugin plugin{"mxf", "of the tests"};  // outlives the engine
     EngineScope engine;
-    QvPlugin plugin{"mxf", "of the tests"};
     TempFolder folder;
 
     P2() {
