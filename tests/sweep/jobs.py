@@ -26,6 +26,7 @@ CLIP = ["clip.yuv", *RAW]
 EFFECTS = ["--subtitles", "talk.srt", "--logo", "mark.png@4,4", "--timecode", "--fade", "0.1", "--crop", "60x40",
            "--flip"]
 
+# Where the result names the decoder, no other one may take a file that the first could not read.
 JOBS = [
     Job("wav", ["transcode", "in.wav", "-o", "out.wav", "-y"], ["transcode", "in3.wav", "-o", "out.wav", "-y"]),
     Job("raw", card("--pixel", "I420", "-o", "card.yuv"), card("--pixel", "I420", "-o", "card.yuv", length=0.28)),
@@ -51,7 +52,7 @@ JOBS = [
         ["frame", *CLIP, "--sheet", "16x1", "-o", "sheet.png", "-y"]),
     Job("effects", ["transcode", *CLIP, *EFFECTS, "-o", "burnt.yuv", "-y"],
         ["transcode", *CLIP, "-o", "burnt.yuv", "-y"]),
-    Job("task", ["transcode", "in.wav", "-o", "out.wav", "--save-task", "task.xml", "--relative", "-y"],
+    Job("task", ["--no-plugins", "transcode", "in.wav", "-o", "out.wav", "--save-task", "task.xml", "--relative", "-y"],
         ["transcode", "in3.wav", "-o", "out.wav", "--save-task", "task.xml", "--relative", "-y"]),
     Job("dump", card("--pixel", "I420", "--filter", "rawdump:filename=dump", "-o", "dumped.yuv"),
         card("--pixel", "I420", "--filter", "rawdump:filename=dump", "-o", "dumped.yuv", length=0.28)),
@@ -59,7 +60,7 @@ JOBS = [
         card("--logo", "shown#9.png@0,0", "--save-task", "shown.xml", "--relative", "-o", "shown.png", length=0.28, size="48x64")),
     Job("beside", ["transcode", *CLIP, "in.wav", "--to", "0.06", "-o", "pair.yuv", "-y"],
         ["transcode", *CLIP, "in3.wav", "--from", "0.1", "-o", "pair.yuv", "-y"]),
-    Job("join", ["transcode", "--join", "clip.yuv@0-0.2", "in.wav", "clip.yuv+in.wav@0.2-0.4", *RAW, "--fade", "2f",
+    Job("join", ["--no-plugins", "transcode", "--join", "clip.yuv@0-0.2", "in.wav", "clip.yuv+in.wav@0.2-0.4", *RAW, "--fade", "2f",
                  "--subtitles", "talk.srt", "--save-task", "joined.xml", "--relative", "-o", "joined.yuv", "-y"],
         ["transcode", *CLIP, "--cut", "0-0.2", "--cut", "0.4-0.5", "--save-task", "joined.xml", "--relative",
          "-o", "joined.yuv", "-y"]),
@@ -69,7 +70,7 @@ JOBS = [
     Job("scope", ["scope", *CLIP, "-o", "levels.png", "-y"],
         ["scope", *CLIP, "--at", "0.4", "-o", "levels.png", "-y"]),
     Job("captions", ["captions", "one.scc", "--json"], stdout=True),
-    Job("info", ["info", "in.wav", "talk.srt", "--json"], stdout=True),
+    Job("info", ["--no-plugins", "info", "in.wav", "talk.srt", "--json"], stdout=True),
 ]
 
 

@@ -60,22 +60,20 @@ SharedFile::SharedFile(const std::string& name, Msg refused)
 
 void SharedFile::replace(const std::function<void(const std::string& name)>& write) {
     const fs::path place = name_, folder = place.parent_path();
-    const std::string fresh = name_ + ".new", entry = place.filename().string();
+    const std::string entry = place.filename().string(), freshEntry = entry + ".new", fresh = name_ + ".new";
     unlink(fresh.c_str());  // of a run that was ended
     int result = 0;
     try {
         write(fresh);
+        const Descriptor open(openFolder(folder.empty() ? "." : folder.c_str()));
+        if (!open) result = errno;
+        if (result == 0) result = keepMode(place, fresh);
+        if (result == 0) result = syncFile(open.get(), freshEntry.c_str());
+        if (result == 0) result = renameOver(open.get(), freshEntry.c_str(), open.get(), entry.c_str());
+        if (result == 0) result = syncFolder(open.get());
+        if (result != 0) throw systemFailure(refused_, name_, result);
     } catch (...) {
         unlink(fresh.c_str());
         throw;
     }
-    const Descriptor open(openFolder(folder.empty() ? "." : folder.c_str()));
-    if (!open) result = errno;
-    if (result == 0) result = keepMode(place, fresh);
-    if (result == 0) result = syncFile(open.get(), (entry + ".new").c_str());
-    if (result == 0) result = renameOver(open.get(), (entry + ".new").c_str(), open.get(), entry.c_str());
-    if (result == 0) result = syncFolder(open.get());
-    if (result == 0) return;
-    unlink(fresh.c_str());
-    throw systemFailure(refused_, name_, result);
 }
