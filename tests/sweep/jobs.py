@@ -69,6 +69,7 @@ JOBS = [
         ["compare", "clip.yuv", *CLIP, "--sheet", "worst.png", "-y"]),
     Job("scope", ["scope", *CLIP, "-o", "levels.png", "-y"],
         ["scope", *CLIP, "--at", "0.4", "-o", "levels.png", "-y"]),
+    Job("film", ["transcode", "film.y4m", "-o", "film.yuv", "-y"], ["transcode", *CLIP, "-o", "film.yuv", "-y"]),
     Job("captions", ["captions", "one.scc", "--json"], stdout=True),
     Job("info", ["--no-plugins", "info", "in.wav", "talk.srt", "--json"], stdout=True),
 ]
@@ -99,8 +100,14 @@ SCC = (b"Scenarist_SCC V1.0\n\n"
        b"00:00:01:00\t9420 9420 94ae 94ae 9470 9470 c8e5 ecec ef80 942f 942f\n\n00:00:03:00\t942c 942c\n")
 
 
+def film(frames):
+    picture = 64 * 48 * 3 // 2
+    return b"YUV4MPEG2 W64 H48 F25:1 Ip A1:1 C420jpeg\n" + b"".join(
+        b"FRAME\n" + pattern(picture, 3 + i) for i in range(frames))
+
+
 def inputs():
     return {"in.wav": wav(pattern(12000)), "in3.wav": wav(pattern(9000, 11), channels=3),
-            "clip.yuv": pattern(64 * 48 * 3 // 2 * 20), "mark.png": png(20, 10),
+            "clip.yuv": pattern(64 * 48 * 3 // 2 * 20), "film.y4m": film(8), "mark.png": png(20, 10),
             "shown#9.png": png(12, 12), "talk.srt": SRT, "one.scc": SCC,
             "stored.xml": (pathlib.Path(__file__).parent / "stored.xml").read_bytes()}

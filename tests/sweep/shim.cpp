@@ -419,6 +419,8 @@ OUTSIDE(void*, FcFontMatch, (void* a, void* b, void* c), a, b, c)
 OUTSIDE(void, FcDefaultSubstitute, (void* a), a)
 OUTSIDE(void*, iconv_open, (const char* a, const char* b), a, b)
 OUTSIDE(int, iconv_close, (void* a), a)
+// Constructors of the codec libraries end the program where they have no memory.
+OUTSIDE(void*, dlopen, (const char* a, int b), a, b)
 
 // A sanitizer's, at the start of each thread, which it does not survive failing.
 OUTSIDE(int, pthread_getattr_np, (pthread_t a, pthread_attr_t* b), a, b)

@@ -1,5 +1,6 @@
 #include <atomic>
 #include <exception>
+#include <new>
 #include <string>
 
 #include "core/arch/platform.h"
@@ -46,6 +47,8 @@ QvPluginLoad initialise(void* library) {
         return failure(QvPluginFault::declined, "declined to load");
     } catch (const QvException& thrown) {
         text = std::string(": ") + thrown.what();
+    } catch (const std::bad_alloc&) {
+        text = ": out of memory";
     } catch (const std::exception& thrown) {
         text = std::string(": ") + thrown.what();
     } catch (...) {

@@ -93,6 +93,10 @@ bool DecodedPictures::feed() {
     }
     const int result = avcodec_send_packet(codec_.get(), packet_.get());
     waiting_ = result == AVERROR(EAGAIN);
+    if (result == AVERROR(ENOMEM)) {
+        failure_ = "out of memory";
+        return false;
+    }
     // Other failures are the packet's own: its picture does not come, and the reader sees that.
     if (!waiting_) av_packet_unref(packet_.get());
     return true;

@@ -87,6 +87,10 @@ class SampleReader::Decoding {
     }
     bool seek(std::size_t packet);
     Next decode();
+    Next outOfMemory() {
+        failure_ = "out of memory";
+        return Next::failed;
+    }
 };
 
 bool SampleReader::Decoding::open(const MediaBytes& bytes, const std::string& format, int stream,
@@ -140,6 +144,7 @@ SampleReader::Decoding::Next SampleReader::Decoding::decode() {
         const int result = avcodec_receive_frame(codec_.get(), frame_.get());
         if (result >= 0) return Next::block;
         if (result == AVERROR_EOF || (draining_ && result == AVERROR(EAGAIN))) return Next::end;
+        if (result == AVERROR(ENOMEM)) return outOfMemory();
         if (draining_) continue;
         started_ = true;
         if (!waiting_) {
@@ -156,6 +161,7 @@ SampleReader::Decoding::Next SampleReader::Decoding::decode() {
             codec_->reordered_opaque = static_cast<std::int64_t>(position_++);
         }
         const int sent = avcodec_send_packet(codec_.get(), packet_.get());
+        if (sent == AVERROR(ENOMEM)) return outOfMemory();
         waiting_ = sent == AVERROR(EAGAIN);
         if (waiting_) continue;
         if (sent < 0) ++lost_;

@@ -250,7 +250,8 @@ MediaInput::Read MediaInput::read(AVPacket& packet) {
             failure_ = state_->source->problem();
             return Read::failed;
         }
-        if (result == AVERROR_EOF || state_->io->eof_reached) return Read::end;
+        const bool noMemory = result == AVERROR(ENOMEM);
+        if (!noMemory && (result == AVERROR_EOF || state_->io->eof_reached)) return Read::end;
         if (result == AVERROR(EAGAIN) && ++failures < 100) continue;
         failure_ = reasonOf(result);
         return Read::failed;
