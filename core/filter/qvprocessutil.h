@@ -41,7 +41,7 @@ class QV_API QvProcessUtil {
     // A null module name means "vprocess"; a name without module asserts. A pipe that fails to open asserts.
     static QvVProcessPipe* createVideoPipeAux(const VideoJobDescription& job, const char* moduleName,
                                               bool deferOpen);
-    // Tells the encoder what the pipe (null: none) already does and what it is to do itself.
+    // Sets in the encoder what the pipe (null: none) already does and what the encoder is to do itself.
     static void adjustVideoEncoder(const VideoJobDescription& job, QvVProcessPipe* pipe,
                                    QvEncodePipe* encoderPipe, int encoderStream);
 

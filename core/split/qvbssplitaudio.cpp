@@ -81,7 +81,7 @@ struct QvBsSplitAudio::Wav {
     std::vector<std::unique_ptr<File>> files;  // one for each channel, or the only one
     QvPcm work;                                // interleaved samples of one access unit; in split mode only
     AnyVector channelPointers;
-    std::vector<unsigned char> chunks;  // to follow the samples, as they stand in a file
+    std::vector<unsigned char> chunks;  // complete chunks, to be written after the samples
     bool mayBeRf64 = false;
     unsigned carried = 0;  // bytes of an incomplete sample at the head of the ring
 

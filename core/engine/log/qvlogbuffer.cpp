@@ -66,7 +66,7 @@ void QvLogBuffer::logs(int mask, const char* text) {
         messages_.append(message);
         qv_dbg()->logs(mask, asFormatted(text).c_str());
     } catch (const std::bad_alloc&) {
-        // Messages come from clean-ups too, which go on without them.
+        // Clean-ups report too and must continue, so a message without memory is lost.
     }
 }
 

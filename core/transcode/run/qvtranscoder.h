@@ -50,7 +50,7 @@ class QV_API QvTranscoder {
     // Runs `task` in place of the current one, which comes back when the run is over.
     virtual int transcode(QvTask* task, bool synchronous);
     // Runs the current task. Synchronous: the result of the run. Asynchronous: 0 once the worker is
-    // started. QvStatus::warning (-16): legal with a warning, and the run went on; QvStatus::notLegal (-11)
+    // started. QvStatus::warning (-16): legal with a warning, and it ran; QvStatus::notLegal (-11)
     // and other failures: errorDesc() has the text and nothing was written.
     virtual int transcode(bool synchronous);
     // Ends a run and waits until it has ended; from any thread. From a callback it asks for the end alone.

@@ -8,8 +8,9 @@
 // Keys: "__version__", "__class__", "encoder" (a QvEncodePipeState), "filename" (of the output), "files" (a
 // Vector of File), "streams" (a Vector with a Dict for each output stream: "type", and "sources", a Vector
 // with a Source for each segment), "postProcess", "enabled", "segments" (a Vector of 1 and 0), "presetName".
-// "#nsegs" is the number of segments as last counted, -1 when the streams differ: who changes "streams" by
-// hand removes it. "segments" appears when a segment is first enabled, disabled, added, removed or moved.
+// "#nsegs" is the number of segments as last counted, -1 when the streams differ: code that
+// changes "streams" by hand removes it. "segments" appears when a segment is first enabled, disabled, added,
+// removed or moved.
 //
 // A *segment* is one Source for each output stream; several are played one after the other. What is absent,
 // or of another type, reads as an empty value. Wrong indexes and counts are a line in the log and an
