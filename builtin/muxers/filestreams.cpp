@@ -248,7 +248,7 @@ int FileMultiplexer::checkNames() {
     return QvStatus::ok;
 }
 
-// The stream that is farthest behind in time is next, so that a container gets what belongs together.
+// The stream with the earliest time is next, so that a container gets picture and sound of one time together.
 int FileMultiplexer::feed() {
     long long written = 0;
     while (written < total_) {
