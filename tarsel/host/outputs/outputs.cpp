@@ -31,7 +31,7 @@ fs::path folderOf(const fs::path& name) {
     return name.has_parent_path() ? name.parent_path() : fs::path(".");
 }
 
-// Beside `name`, without a "./" in front.
+// A file in the folder of `name`, without a "./" in front.
 fs::path sibling(const fs::path& name, const std::string& filename) {
     return name.has_parent_path() ? name.parent_path() / filename : fs::path(filename);
 }
@@ -79,10 +79,10 @@ fs::path followed(fs::path name) {
     return name;
 }
 
-// That `name` is not written, as it exists.
+// The failure that says `name` exists and is not written.
 Failure existing(const fs::path& name, const OutputPolicy& policy) {
-    const Failure told = failure(policy.keep ? Msg::outputKept : Msg::outputExists, {name.string()});
-    return policy.keep && policy.quiet ? Failure(Exit::done, "") : told;
+    if (policy.keep && policy.quiet) return Failure(Exit::done, "");
+    return failure(policy.keep ? Msg::outputKept : Msg::outputExists, {name.string()});
 }
 
 // What follows the stem of a name, "#7.png" as "##.png": numbers make no other set.
@@ -264,7 +264,7 @@ std::vector<fs::path> Outputs::written() const {
     return files;
 }
 
-// Whether the entry `name` beside the output may be removed as one of its former files.
+// Whether the entry `name` of the output's folder may be removed as one of its former files.
 bool Outputs::mayGo(const std::string& name) const {
     std::error_code error;
     const fs::path path = sibling(output_, name);
