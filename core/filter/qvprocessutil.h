@@ -65,7 +65,7 @@ class QV_API QvProcessUtil {
                                   long long from, long long to, const QvReadWatch& watch = {});
 
     // Frame numbers at one rate to another. The first element decides whether they are Int32 or Int64; `out`
-    // stays as it was when `in` is empty.
+    // is unchanged when `in` is empty.
     static void rescaleTimePoints(const AnyVector& in, const QvFramerate& fromRate, const QvFramerate& toRate,
                                   AnyVector* out);
     // What each stream has to be delayed by in smart rendering, in ticks: "video" and "audio", one Int64 a

@@ -19,8 +19,8 @@ std::recursive_mutex& section() {
 }
 using Lock = std::lock_guard<std::recursive_mutex>;
 
-// The debug log takes the text as a format without arguments: "%%" stands for "%", and as nothing may be read
-// for any other conversion, it stays as it is.
+// The debug log takes the text as a format without arguments: "%%" becomes "%". Any other conversion is kept
+// as text, because there is no argument to read.
 std::string asFormatted(const char* text) {
     std::string out;
     for (const char* c = text; *c; ++c) {
