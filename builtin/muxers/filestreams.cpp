@@ -26,7 +26,7 @@ constexpr long long mostUnitBytes = 1LL << 30;
 constexpr int blocksPerSecond = 25;  // of sound
 constexpr unsigned videoInfoBytes = 32, audioInfoBytes = 16;
 
-// Stands for the encoder of a stream: the multiplexer asks it what it would ask the encoder.
+// Takes the place of the encoder of a stream: answers what the multiplexer asks the encoder.
 class FileEncoder : public QvEncoder {
   public:
     FileEncoder(const QvModule* module, const QvFileMuxStream& stream) : QvEncoder(module), stream_(stream) {
