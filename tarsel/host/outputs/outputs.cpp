@@ -97,7 +97,7 @@ std::string shapeOf(std::string_view name) {
     return shape;
 }
 
-// The number in "card#0007.png" after "card#"; -1 for another name, or a number beyond any use.
+// The number in "card#0007.png" after "card#"; -1 for another name or more than 18 digits.
 long long numberIn(const std::string& name, const std::string& start, const std::string& extension) {
     const size_t end = name.size() - std::min(name.size(), extension.size());
     if (name.rfind(start, 0) != 0 || end <= start.size() || name.substr(end) != extension) return -1;
@@ -228,7 +228,7 @@ std::string Outputs::numberedName(const std::string& rest, const std::string& fr
 std::string Outputs::finalName(const fs::path& written, const std::string& from) const {
     const std::string rest = written.filename().string().substr(base_.size());
     if (numbered_ && !rest.empty()) return sibling(output_, numberedName(rest, from)).string();
-    // What was begun without an extension keeps the whole name.
+    // Begun without an extension, the file gets the whole name.
     fs::path name = rest.empty() ? output_.filename() : output_.stem();
     name += rest == "." + from ? output_.extension().string() : rest;
     return (output_.has_parent_path() ? output_.parent_path() / name : name).string();
@@ -242,7 +242,7 @@ bool Outputs::numbers(const std::string& place, const std::string& extension) co
     return numberIn(name, output_.stem().string() + "#", "." + extension) >= 0;
 }
 
-// A link is followed by an output of one file.
+// Only an output of one file follows a link.
 fs::path Outputs::targetOf(const fs::path& name) const { return !set_ && name == output_ ? target_ : name; }
 
 std::string Outputs::placeOf(const fs::path& name) const {
@@ -333,7 +333,7 @@ std::vector<std::string> Outputs::formerSet(const std::vector<Manifest::Row>& fr
             names.insert(name);
         hadPictures = hadPictures || isPicture(shape);
     }
-    // Sound alone may be anything.
+    // Sound without pictures may be another file of the user's.
     if (hadPictures) names.insert(sound.begin(), sound.end());
     return {names.begin(), names.end()};
 }
