@@ -1,5 +1,5 @@
-// Tasks of several segments: how long they take to open, and what a join costs beside a plain job. Lists of
-// many tasks: what reading, writing and changing them costs beside the XML alone.
+// Tasks of several segments: how long they take to open, and what a join costs compared with a plain job.
+// Lists of many tasks: what reading, writing and changing them costs compared with the XML alone.
 #include <cstdio>
 #include <cstring>
 #include <fstream>

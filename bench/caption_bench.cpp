@@ -1,4 +1,4 @@
-// SCC files: opening one beside a grep process over it; the dealing out of captions beside a plain copy.
+// SCC files: opening one compared with a grep process over it; dealing out captions compared with a copy.
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>

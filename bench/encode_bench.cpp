@@ -1,5 +1,5 @@
-// Writing uncompressed 1080p through the encode pipe (raw encoder, elementary export, file), beside a bare
-// write() of the same bytes to a file of the same folder, both for as many frames.
+// Writing uncompressed 1080p through the encode pipe (raw encoder, elementary export, file), compared with a
+// bare write() of the same bytes to a file of the same folder, both for as many frames.
 //
 //     bench_encode     "ratio" is the pipe's best time to the bare best; 1 is no cost at all. BENCH_DIR names
 //     the folder.

@@ -1,5 +1,5 @@
-// What links and pipes cost beside the work that they pass on. The counter "ratio" is our time to that of the
-// bare calls of decoder and encoder, the best of several runs taken in turns, in processor time.
+// What links and pipes cost compared with the work that they pass on. The counter "ratio" is our time to that
+// of the bare calls of decoder and encoder, the best of several runs taken in turns, in processor time.
 #include <benchmark/benchmark.h>
 
 #include <algorithm>

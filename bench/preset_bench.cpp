@@ -1,5 +1,5 @@
-// The catalogue of presets: what an update costs with few and with many modules, beside a copy of the list
-// that it makes and a walk through the modules that it looks at.
+// The catalogue of presets: what an update costs with few and with many modules, compared with a copy of the
+// list that it makes and a walk through the modules that it looks at.
 #include <benchmark/benchmark.h>
 
 #include <string>

@@ -1,4 +1,4 @@
-# One set of objects serves the shared library and, for unit tests of what is not exported, a static one.
+# One set of objects makes the shared library and, for unit tests of what is not exported, a static one.
 file(GLOB_RECURSE QV_SOURCES CONFIGURE_DEPENDS
      ${CMAKE_SOURCE_DIR}/core/*.cpp ${CMAKE_SOURCE_DIR}/builtin/*.cpp)
 

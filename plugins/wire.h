@@ -1,11 +1,10 @@
-// What encoders and multiplexers of plug-ins say to each other through bufstream::auxinfo, so that those of
-// one maker fit those of another. The engine carries these records and reads none of them but the first word
-// of a unit.
+// What encoders and multiplexers of plug-ins exchange through bufstream::auxinfo, so that those of one maker
+// fit those of another. The engine carries these records and reads none of them but the first word of a unit.
 //
 // Order of a stream's side information:
-//     VIDEO_STREAM_INFO or AUDIO_STREAM_INFO     from the encoder's open: the multiplexer is open by then.
-//     Again
-//                                                from close, where the codec's own data have changed (FLAC)
+//     VIDEO_STREAM_INFO or AUDIO_STREAM_INFO     from the encoder's open: the multiplexer is open by then;
+//                                                from close again, if the codec's own data have changed
+//                                                (FLAC)
 //     bytes of a unit, VIDEO_AU_CODE or AUDIO_AU_CODE, bytes of the next unit, ...
 //
 // The bytes of a unit may come in several blocks, no one longer than the stream's chunk size; its side

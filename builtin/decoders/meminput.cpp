@@ -141,20 +141,20 @@ int MemInput::restore(const AnyDict& state) {
 
 // Why the decoder does not take what it is given; "" if it does.
 std::string MemInput::setUp(QvDecodePipe& decoder) const {
-    const std::string who = decoder.name();
+    const std::string module = decoder.name();
     for (const Any& row : qvParameters(decoder)) {
         const char* needed = row.asDict().isSet("needed") ? row.asDict().getString("name", "") : "";
         if (*needed && !kept_.isSet(needed) && !restored_.isSet(needed))
-            return who + " needs '" + needed + "'";
+            return module + " needs '" + needed + "'";
     }
     if (!restored_.empty()) decoder.restore(restored_);
     if (qvSetOptionalParam(decoder, qvSourceParam, qvSourceValue(source_)) != QvStatus::ok)
-        return who + " reads files only, not bytes in memory";
+        return module + " reads files only, not bytes in memory";
     if (qvSetOptionalParam(decoder, "filename", shownName()) != QvStatus::ok)
-        return who + " does not take the name " + textOf(shownName());
+        return module + " does not take the name " + textOf(shownName());
     for (const auto [key, value] : kept_) {
         if (qvSetOptionalParam(decoder, key, *value) == QvStatus::ok) continue;
-        return who + " does not take the parameter '" + key + "'" +
+        return module + " does not take the parameter '" + key + "'" +
                (*decoder.errorDesc() ? std::string(": ") + decoder.errorDesc() : "");
     }
     return "";

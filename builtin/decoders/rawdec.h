@@ -4,8 +4,8 @@
 //
 // A frame's bytes are the planes of its FOURCC at their default strides. "BGR6" (16 bits a component, the
 // high byte at odd positions), "BGRU" (three bytes a pixel, rows without padding) and "v210" (delivered as
-// Y216) are known beside the formats of QvFrame. A rest after the last frame shows as "truncated" in the
-// stream's parameters.
+// Y216) are known in addition to the formats of QvFrame. A rest after the last frame sets "truncated" in
+// the stream's parameters.
 //
 // Parameters: "filename", "source" (see QvByteSource; it has to know its size and to be sought), "FOURCC" or
 // "extendedFOURCC" (Int32, or String of four characters; default "BGR4"), "width", "height" (pixels, default

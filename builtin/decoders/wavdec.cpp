@@ -154,7 +154,7 @@ void WavStream::countClippedWithin(long long from, long long to) {
 
 int WavStream::seek(long long sample) {
     pcm->setSamples(0);
-    // Behind the end there is nothing to read, so the file need not move.
+    // After the end there is nothing to read, so the file is left where it is.
     const long long within = std::min(sample, header_.samples);
     if (within < 0 || !file_.seek(header_.dataOffset + within * header_.frameBytes()))
         return QvStatus::endOfStream;

@@ -51,7 +51,7 @@ class ChunkReader {
         return file_.seek(position) && file_.read(to, 1, count) == count;
     }
     bool chunkAt(long long position, Chunk& chunk);
-    long long behindChunk(long long position, const Chunk& chunk);
+    long long afterChunk(long long position, const Chunk& chunk);
 
   protected:
     InputFile& file_;
@@ -104,7 +104,7 @@ bool ChunkReader::chunkAt(long long position, Chunk& chunk) {
 }
 
 // Where the next chunk begins. Some writers forget the padding of an odd chunk.
-long long ChunkReader::behindChunk(long long position, const Chunk& chunk) {
+long long ChunkReader::afterChunk(long long position, const Chunk& chunk) {
     const long long end = position + 8 + chunk.size;
     if (chunk.size % 2 == 0) return end;
     Chunk next;
@@ -134,11 +134,11 @@ WavStatus HeaderReader::findFormat() {
         const int smallest = extended_ ? 0 : 1;
         if (!chunkAt(position, chunk) || static_cast<std::int32_t>(chunk.size) < smallest) break;
         if (chunk.id == "fmt ") {
-            formatEnd_ = behindChunk(position, chunk);
+            formatEnd_ = afterChunk(position, chunk);
             return readFormat(position + 8, chunk.size) ? WavStatus::ok : WavStatus::cannotParse;
         }
         if (isRf64() && chunk.id == "ds64" && !readDs64(position + 8, chunk.size)) break;
-        position = behindChunk(position, chunk);
+        position = afterChunk(position, chunk);
     }
     return WavStatus::cannotParse;
 }
@@ -187,7 +187,7 @@ bool HeaderReader::findDataByChunks() {
     Chunk chunk;
     for (int i = 0; i < maxChunks && position <= last && chunkAt(position, chunk); ++i) {
         if (chunk.id == "data") return takeDataAt(position);
-        position = behindChunk(position, chunk);
+        position = afterChunk(position, chunk);
     }
     return false;
 }
@@ -239,7 +239,7 @@ WavStatus HeaderReader::checkFormat() {
 // Whole chunks from here to the end of the file: then an empty "data" chunk is meant so.
 bool HeaderReader::chunksFillTheRest(long long position) {
     Chunk chunk;
-    for (int i = 0; i < maxChunks && chunkAt(position, chunk); ++i) position = behindChunk(position, chunk);
+    for (int i = 0; i < maxChunks && chunkAt(position, chunk); ++i) position = afterChunk(position, chunk);
     return position == file_.length();
 }
 
@@ -309,7 +309,7 @@ class ChunkCollector : private ChunkReader {
         for (Chunk chunk; left_ > 0 && position + 8 <= end && chunkAt(position, chunk); --left_) {
             if (!isPlausible(chunk.id) || chunk.id == "data" || position + 8 + chunk.size > end) return;
             if (!isOfTheFile(chunk.id)) take(position + 8, chunk);
-            position = behindChunk(position, chunk);
+            position = afterChunk(position, chunk);
         }
     }
     bool isChunkAt(long long position) {

@@ -7,12 +7,12 @@
 //     "data" size interleaved samples
 //     chunk*
 //
-// Sizes that a recorder could not know when it wrote the header mean "to the end of the file", and a size
+// A size that a recorder did not correct after it wrote the header means "to the end of the file". A size
 // beyond the end is cut to what is there.
 //
 // Plain files have PCM of 8, 16 or 24 bits, up to 8 channels, and "RIFF". The extended reading also takes
 // other codings and widths, more channels, 64-bit sizes, and "RIFX", where all numbers are big-endian. "data"
-// may be as far away as the chunks before it take, and chunks before "fmt " may be empty.
+// may follow any number of chunks, and chunks before "fmt " may be empty.
 #pragma once
 
 #include <string>
@@ -34,7 +34,7 @@ enum class WavCoding { integer, floating, aLaw, muLaw };
 constexpr int wavMostChannels = 256;  // of the extended reading
 
 struct WavHeader {
-    long long fileSize = 0;          // bytes, as the RIFF header says, but never more than there are
+    long long fileSize = 0;          // bytes, as the RIFF header states, at most the real size
     int channels = 0;                // 1 .. 8, extended 1 .. wavMostChannels
     int samplerate = 0;              // above 0
     long long samples = 0;           // that the file holds
@@ -60,9 +60,9 @@ struct WavChunk {
     std::string data;  // without its padding
 };
 
-// The chunks before and after the samples of a file with that header, in their order: those with words and
-// marks ("bext", "iXML", "cue ", and "LIST" of INFO and adtl) in `kept`, the ids of all others in `others`,
-// but for what describes the file itself or fills it up. Of a big-endian file, whose chunks have big-endian
-// numbers, only iXML is kept. So is no chunk with which the kept ones would have more than 16 MiB.
+// The chunks before and after the samples, in their order. Texts and markers ("bext", "iXML", "cue ", and
+// "LIST" of INFO and adtl) go to `kept`, the ids of the others to `others`, except those that describe the
+// file itself or fill it up. A big-endian file has big-endian numbers in its chunks, so only its iXML is
+// kept. A chunk that would take the kept ones beyond 16 MiB is not kept.
 void readWavChunks(InputFile& file, const WavHeader& header, std::vector<WavChunk>& kept,
                    std::vector<std::string>& others);

@@ -26,7 +26,7 @@ constexpr long long mostUnitBytes = 1LL << 30;
 constexpr int blocksPerSecond = 25;  // of sound
 constexpr unsigned videoInfoBytes = 32, audioInfoBytes = 16;
 
-// Stands for the encoder of a stream: the multiplexer asks it what it would ask the encoder.
+// Takes the place of the encoder of a stream: answers what the multiplexer asks the encoder.
 class FileEncoder : public QvEncoder {
   public:
     FileEncoder(const QvModule* module, const QvFileMuxStream& stream) : QvEncoder(module), stream_(stream) {
@@ -248,7 +248,7 @@ int FileMultiplexer::checkNames() {
     return QvStatus::ok;
 }
 
-// The stream that is farthest behind in time is next, so that a container gets what belongs together.
+// The stream with the earliest time is next, so that a container gets picture and sound of one time together.
 int FileMultiplexer::feed() {
     long long written = 0;
     while (written < total_) {

@@ -88,7 +88,7 @@ bool AviPicture::write(const unsigned char* frame, const Put& put) {
             if (!writeRows(plane, frame + plane.from, put)) return false;
             continue;
         }
-        // Planes that follow each other as they are go out as one.
+        // Adjacent planes that need no change are written at once.
         size_t end = plane.from + plane.toStride * positive(plane.toRows);
         while (i + 1 < planes_.size() && planes_[i + 1].asItIs() && planes_[i + 1].from == end) {
             ++i;

@@ -86,7 +86,8 @@ int QvVf::close() {
     return result;
 }
 
-// Frames go on without what a filter should have done to them: the first failure stays to be asked for.
+// The first failure or warning is kept as the pipe's error; frames continue without what the filter should
+// have done to them.
 int QvVf::noted(int result, const QvVideoFilter& filter) {
     if (result != QvStatus::ok && result != QvStatus::warning && errorCode() == QvStatus::ok)
         setError(result, "%s: %s", filter.name(), *filter.errorDesc() ? filter.errorDesc() : "it failed");

@@ -7,7 +7,7 @@
 class QvBufStream;
 
 // Parameter of a stream whose `copybytes` takes any number of bytes and passes them on at once, as a file's
-// does. Whoever makes such a stream sets it to Int32 1; data then goes out without a copy in between.
+// does. Code that makes such a stream sets it to Int32 1; data then goes out without a copy in between.
 constexpr char rawWriteThrough[] = "writeThrough";
 
 enum class RawPutResult {

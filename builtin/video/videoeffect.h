@@ -64,7 +64,7 @@ class VideoEffectOf : public VideoEffect {
         if (const auto result = _setRow<Settings>(rows_, settings_, name, value)) return *result;
         return VideoEffect::setParam(name, value);
     }
-    // Beside the rows "paramSet", if some have a description.
+    // The rows, and "paramSet" if some of them have a description.
     void getParam(const char* name, Any& value) const override {
         if (qvGetParamRow<Settings>(rows_, settings_, name, value)) return;
         if (std::strcmp(name, "paramSet") == 0) {

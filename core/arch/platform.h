@@ -82,8 +82,8 @@ class QV_API QvPlatform {
     // the C library; a substitute that wants these to fail returns a stream of its own making.
     virtual std::FILE* openFile(const char* name, const char* mode);
     // openFile for writing ("wb") of what may be no file. A pipe, a socket, a terminal, a device and what is
-    // named by one of this process's own descriptors ("/dev/stdout", "/dev/fd/3") becomes a stream, which
-    // `isStream` tells: it is written from where it stands, can't be sought, and a wait for its reader ends
+    // named by one of this process's own descriptors ("/dev/stdout", "/dev/fd/3") is a stream, and sets
+    // `isStream`: writing starts at its current position, it can't be sought, and a wait for its reader ends
     // with ECANCELED after a request of `cancel` (null: never). Inherited descriptors keep their flags.
     virtual std::FILE* openOutput(const char* name, const std::shared_ptr<QvCancel>& cancel, bool& isStream);
     // A file descriptor of the C runtime for libraries that take nothing else, or -1. Writing creates or

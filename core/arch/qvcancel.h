@@ -41,8 +41,8 @@ class QV_API QvCancel {
     std::atomic<bool> gaveUp_{false};
 };
 
-// What writes an output of its own beside those of the encode pipe, such as a filter that stores frames. A
-// codec that derives from it as well is given the run's QvCancel by TransVLink, before it is opened.
+// For codecs that write an output of their own, other than those of the encode pipe; a filter that stores
+// frames, for example. TransVLink gives a codec that also derives from it the run's QvCancel before open.
 class QV_API QvCancellable {
   public:
     virtual ~QvCancellable();

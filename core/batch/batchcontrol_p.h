@@ -1,4 +1,4 @@
-// What the threads of a batch processor share: whether a run is going on and where it is, and the wishes to
+// What the threads of a batch processor share: the state of the run, and the requests to
 // stop and to pause it.
 //
 // All of it is changed under one lock; what is asked for often is also readable without. One condition wakes
@@ -17,7 +17,8 @@ class BatchControl {
     // --- The life of a run. It ends in two steps: leave() says that no task will follow, and the callback of
     // that may still be under way until end().
 
-    void begin(bool synchronous);  // asserts that none is going on; waits for a callback that ends one
+    void begin(
+        bool synchronous);  // asserts that nothing runs; waits for the last callback of the previous run
     // On the thread that runs the tasks. True if it had to begin the run itself.
     bool enter();
     void leave();
@@ -33,19 +34,19 @@ class BatchControl {
     // --- Stop and pause
 
     void requestStop();
-    // When no run is going on: a wish that has come too late is not one for the next run.
+    // Between runs: a request that came too late is not for the next run.
     void dropRequests();
     bool stopping() const { return stopRequested_; }
     void pause(bool on);
     bool paused() const { return paused_; }
-    // Holds this thread while a pause lasts, and is true if there was one. `told` gets true before and false
-    // after it. A stop ends it.
-    template <class Told>
-    bool waitWhilePaused(Told told) {
+    // Holds this thread while a pause lasts, and is true if there was one. `report` gets true before and
+    // false after it. A stop ends it.
+    template <class Report>
+    bool waitWhilePaused(Report report) {
         if (!beginPause()) return false;
-        told(true);
+        report(true);
         waitForResume();
-        told(false);
+        report(false);
         return true;
     }
 

@@ -23,7 +23,7 @@ int refuse(const char* text) {
 }
 
 // A name next to a file that no other process takes.
-std::string nameBeside(const std::string& file) {
+std::string temporaryName(const std::string& file) {
     char mark[24];
     std::snprintf(mark, sizeof mark, ".%08x.tmp", qv_platform().randomBits());
     return file + mark;
@@ -40,7 +40,7 @@ bool isOnDisc(const std::string& file) {
 // A document in place of a file that exists. It is on the disc before it takes the place: a power cut leaves
 // one of the two. Throws QvFileException.
 int replaceFile(const Any& file, const AnyDict& list) {
-    const std::string name = qv_os_name(file), fresh = nameBeside(name);
+    const std::string name = qv_os_name(file), fresh = temporaryName(name);
     const Any target = qv_any_name(fresh, file);
     int result = QvStatus::failed;
     try {

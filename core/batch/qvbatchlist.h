@@ -46,7 +46,7 @@ class QV_API QvBatchList : public AnyVector {
     int restore(const AnyDict& dict);  // -1, and nothing changes, without a Vector "taskList"
 
     // Writes an XML document of type "BatchList", version 2.0: 0, or -1 with a line in the log. A file that
-    // exists is replaced in one step, and stays as it is when this fails. The list itself goes through the
+    // exists is replaced in one step, and is unchanged when this fails. The list itself goes through the
     // document's dictionary and back, so that it is not copied; it is as before also when this fails or
     // throws.
     int save(const Any& file);

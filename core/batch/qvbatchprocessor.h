@@ -10,9 +10,9 @@
 // stop, pause, unpause and the queries may be called from any thread, init and start from any but that of the
 // callbacks.
 //
-// Tasks may come from anywhere: one that is damaged, or is no task at all, is a task that failed, with a text
-// that says at which place: "streams/2/type: it is no type of stream". So is one in which the engine fails an
-// assertion or finds no memory.
+// Tasks may be of any origin. One that is damaged, or no task at all, counts as failed, with a text that
+// names the place: "streams/2/type: it is no type of stream". So does one in which an assertion fails or
+// memory runs out.
 #pragma once
 
 #include <memory>
@@ -20,9 +20,9 @@
 #include "core/arch/api.h"
 #include "core/batch/qvbatchlist.h"
 
-// All calls come from the thread that runs the tasks. Results are not used. What a call throws ends the run
-// as stop() does, and is the processor's error; the task that is under way and the run still get their last
-// call.
+// All calls come from the thread that runs the tasks. Results are not used. An exception from a call ends the
+// run as stop() does, and becomes the processor's error; taskFinished of the current task and batchFinished
+// are still called.
 class QV_API QvBatchProcessCb {
   public:
     enum TaskCode { taskDone = 0, nothingToDo = 1, taskAborted = 2, taskFailed = -1 };
@@ -43,7 +43,7 @@ class QV_API QvBatchProcessCb {
     // After a task was restored, for each of its segments.
     virtual int segmentInitStatus(int task, int segment, int status);
     virtual int segmentStarted(int task, int segment);
-    // At the end of a task for the last of its open segments, also when the run ended before it.
+    // For the last segment also at the end of its task, even if the run ended before that segment did.
     virtual int segmentFinished(int task, int segment, int code, const AnyDict& info);
     virtual int progress(int task, int segment, const AnyDict& info);  // "percent", 0.0 to 1.0 of the task
     virtual int batchPaused(bool paused);                              // a pause took effect, or has ended
@@ -56,8 +56,8 @@ class QV_API QvBatchProcessor {
     QvBatchProcessor& operator=(const QvBatchProcessor&) = delete;
     virtual ~QvBatchProcessor();  // ends a run first
 
-    // Takes the tasks of a list. The list itself is not copied for running: it must live, and keep its tasks
-    // where they are, until the run has ended. An assertion while running.
+    // Takes the tasks of a list. The list is not copied: until the run has ended it must exist, and its tasks
+    // must keep their places. An assertion while running.
     virtual int init(QvBatchList& list);
     // synchronous: runs on this thread and returns when all is done. Otherwise a callback is required
     // (assertion) and the result says whether the thread began. An assertion while running.
@@ -66,8 +66,8 @@ class QV_API QvBatchProcessor {
     // Returns when the run has ended, batchFinished() included; at once if the run is synchronous, and in a
     // callback.
     virtual int stop();
-    // Take effect within a task, at its next round of work, or between two tasks: the task that was due then
-    // is left out. Assertions in a synchronous run.
+    // Take effect at the next round of work of a task, or between two tasks; a pause there leaves out the
+    // task that was due. Assertions in a synchronous run.
     virtual int pause();
     virtual int unpause();
     // What start() runs: 0, or -1 if a callback threw. On its own it is a synchronous run without callbacks.

@@ -20,7 +20,7 @@ class QV_API QvWatchProcessor {
   public:
     virtual ~QvWatchProcessor() = default;
 
-    // Goes on until the input has no more files. `flags` is not used. 0 if every target of every file was
+    // Runs until the input has no more files. `flags` is not used. 0 if every target of every file was
     // made; -1 if one failed, or could not be begun as its folder can't be made. A target whose output would
     // be the input itself, in the watched folder, or that of another target of the file, fails; an older file
     // of that name is replaced.

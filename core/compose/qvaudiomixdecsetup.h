@@ -60,7 +60,7 @@ class QV_API QvAudioMixDecSetup {
     const AnyVector& outChannels() const { return outChannels_; }
 
     void store(AnyDict& dict) const;
-    int restore(const AnyDict& dict);  // -1 if it is none of a set-up, which stays as it was
+    int restore(const AnyDict& dict);  // -1 if it is none of a set-up, which is unchanged
     int save(const Any& path) const;   // as a metafile: QvMetafile::save
     // From a metafile: its code if it can't be opened; -1 if it holds no set-up. The log has the reason.
     int load(const Any& path);

@@ -28,7 +28,7 @@ class QV_API QvMetafile {
     ~QvMetafile();
 
     // Reads a file in place of what is there. File names in "AudioInterleave" become absolute, those of
-    // "MonoInterleave" stay as they are. 0; -15 if the file can't be read or is no metafile; the XML reader's
+    // "MonoInterleave" are unchanged. 0; -15 if the file can't be read or is no metafile; the XML reader's
     // code if it is not well formed. A damaged element is an assertion, see check().
     int open(const Any& path);
     // Why open() would refuse the file, or meet an assertion: with the line where it is known. Empty if it

@@ -37,7 +37,7 @@ double numberOf(const Any& attribute) {
     return qvParseFloat(textOf(attribute, scratch));
 }
 
-// As far as it is a number.
+// 0 for what is no number.
 int integerIn(const AnyDict& dict, const char* key) {
     const Any& value = dict.get(key);
     return value.isInt() || value.isFloat() ? value.toInt32() : 0;

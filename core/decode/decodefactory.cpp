@@ -118,11 +118,11 @@ void setUp(QvDecodePipe& decoder, const Any& filename, const Any& fourcc, const 
 
 // Why `decoder` does not take these parameters; "" when it has taken all.
 std::string setAll(QvDecodePipe& decoder, const AnyDict& params) {
-    const std::string who = decoder.name();
+    const std::string module = decoder.name();
     for (const Any& row : qvParameters(decoder)) {
         const AnyDict& described = row.asDict();
         const char* name = described.getString("name", "");
-        if (described.isSet("needed") && !params.isSet(name)) return who + " needs '" + name + "'";
+        if (described.isSet("needed") && !params.isSet(name)) return module + " needs '" + name + "'";
     }
     for (const auto [name, value] : params) {
         int result = QvStatus::invalidParam;
@@ -132,10 +132,10 @@ std::string setAll(QvDecodePipe& decoder, const AnyDict& params) {
         } catch (const QvParamException&) {
             known = false;
         }
-        if (!known) return who + " has no parameter '" + name + "'";
+        if (!known) return module + " has no parameter '" + name + "'";
         if (result == QvStatus::ok) continue;
-        if (*decoder.errorDesc()) return who + ": " + decoder.errorDesc();
-        return who + " does not take the value of '" + name + "'";
+        if (*decoder.errorDesc()) return module + ": " + decoder.errorDesc();
+        return module + " does not take the value of '" + name + "'";
     }
     return "";
 }

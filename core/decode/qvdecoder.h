@@ -25,9 +25,9 @@
 //            optional "aBitrate" (Int32, kilobits a second)
 //     both   optional "codecParams" (Dict, codec specifics; its "pid" is the stream's program ID)
 //
-// A source that ends before what it announces still delivers what is there: "frames" and "samples" count
-// what can be read. Such a stream then also has "truncated" (Int32, 1) and, as Int64, "framesExpected" or
-// "samplesExpected", what the source announces. Without truncation these keys are absent.
+// A source may end before the length that it announces. "frames" and "samples" count what can be read. Such a
+// stream also has "truncated" (Int32, 1) and the announced length, "framesExpected" or "samplesExpected"
+// (Int64). These keys are absent otherwise.
 #pragma once
 
 #include <functional>
@@ -55,8 +55,8 @@ struct QV_API QvElementaryStream {
     int pid = -1;                 // program ID, -1 when the stream has none
 };
 
-// Of an operation that reads a stream for long: gets what part of it is done, 0 to 1, after each block of
-// some thousand samples; false ends it. May be empty.
+// Watches an operation that reads a whole stream: gets the part that is done, 0 to 1, after each block of
+// some thousand samples; returns false to end it. May be empty.
 using QvReadWatch = std::function<bool(double part)>;
 
 class QV_API QvDecodePipe : public QvCodec {
@@ -69,8 +69,8 @@ class QV_API QvDecodePipe : public QvCodec {
     ~QvDecodePipe() override;
 
     using QvCodec::getParam;
-    // Answers "video0/width" and "video0" (likewise audio and subpic) from the stream operations, so a name
-    // that begins with one of these words can't be a plain parameter of a decoder.
+    // Answers "video0/width" and "video0" (likewise audio and subpic) with the stream operations. So the name
+    // of a decoder's own parameter can't begin with one of these words.
     void getParam(const char* name, Any& value) const override;
     // To be called at the end of a subclass's open, when its streams exist: makes room for overrides and
     // reports and sets state 3. An assertion if the last open was not closed.
@@ -121,7 +121,7 @@ class QV_API QvDecodePipe : public QvCodec {
     virtual int selected(AnyDict& dict) const = 0;
     virtual bool isSelected(int type, int stream) const = 0;
 
-    // Overrides correct what a source claims, as a wrong aspect ratio; they live from open to close.
+    // Overrides correct what a source states, such as a wrong aspect ratio; they last from open to close.
     // Names that a user may override.
     virtual AnyVector overridableParams(int type, int stream);
     // Remembers the value; an invalid `value` goes back to the one before the first override. A subclass
@@ -133,7 +133,7 @@ class QV_API QvDecodePipe : public QvCodec {
     // A Dict for each stream; it also holds "NAME_orig" for each overridden NAME.
     virtual const AnyVector& overrides(int type) const;
 
-    // Of decoders that hand out coded frames; others assert.
+    // For decoders that give coded frames; others assert.
     virtual int encodedFrameSize(int stream);
     virtual int readEncodedFrame(int stream, unsigned char* to);
     virtual int setReadUserData(int type, int stream, bool on);
@@ -148,8 +148,8 @@ class QV_API QvDecodePipe : public QvCodec {
     int nrSubpicStreams() const { return nrStreams(qvSubpicStream); }
 
     // Peak levels of a stream, made by reading it once from start to end on the first call; the stream is at
-    // sample 0 afterwards. Null: no such stream, or it can't be read. Owned by the decoder, until close.
-    // Also null, with nothing kept, when `watch` ended it.
+    // sample 0 afterwards. Owned by the decoder, valid until close. Null: no such stream, it can't be read,
+    // or `watch` ended it; the next call then reads it again.
     QvAudioStreamReport* getAudioStreamReport(int stream, const QvReadWatch& watch = {});
 
   private:

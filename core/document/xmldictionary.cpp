@@ -16,7 +16,7 @@ Any versionText(const Any& given, const AnyDict& dict) {
     return version.isTrue() ? version : Any("2.0");
 }
 
-// A broken contract: the result says so, and the log gets a line too.
+// A class name that is no text is a broken contract: a line in the log, and false.
 bool hasClass(const Any& className) {
     try {
         QV_ASSERT(className.isString());

@@ -70,7 +70,7 @@ class QV_API XmlTrans {
     void parseObject(const XmlNode* from, Any& to);
 
   protected:
-    // By the type, a value of Any::Type. False if it has no element: `to` stays as it is.
+    // By the type, a value of Any::Type. False if it has no element: `to` is unchanged.
     bool parseTyped(int type, const XmlNode* from, Any& to);
 };
 

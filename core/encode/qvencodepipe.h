@@ -63,13 +63,13 @@ class QV_API QvEncodePipe : public QvCodec {
     virtual int abort() = 0;
     // The multiplexer's, then the sink's flush; results ORed.
     virtual int flush();
-    // To the video (audio) encoder of that number, which is asserted to exist. A null frame means smart
-    // rendering.
+    // Passes a frame (samples) to the video (audio) encoder of that number; asserts that there is one. A null
+    // frame means smart rendering.
     virtual int writeFrame(QvFrame* frame, int stream) = 0;
     virtual int writePcm(QvPcm* pcm, int stream) = 0;
 
-    // Make the pipe follow a preset, by itself or by profile number. Streams that exist are replaced.
-    // QvStatus::invalidStructure for an unknown profile, failed when a stream can't be added.
+    // Set the pipe up by a preset, or by the built-in preset of a profile number. Existing streams are
+    // replaced. QvStatus::invalidStructure for an unknown profile, failed when a stream can't be added.
     virtual int applyPreset(const QvPreset& preset, int keep) = 0;
     virtual int applyPreset(int profile, int keep) = 0;
     // The stream part of the state, tagged as a preset.
@@ -91,8 +91,8 @@ class QV_API QvEncodePipe : public QvCodec {
     virtual void removeStream(QvOStream* stream) = 0;
     virtual void removeStream(int type, int nr) = 0;
     virtual void removeStreams(int mask) = 0;
-    // Exchanges the encoder of a stream. With empty `params` the settings that the module had when it was
-    // last replaced in this pipe come back, else the defaults.
+    // Exchanges the encoder of a stream. With empty `params` the module gets the settings that it had when it
+    // was last replaced in this pipe, or its defaults if it was not.
     virtual int setCodec(int type, int nr, const char* name, const AnyDict& params) = 0;
     // How many more streams of a type fit: -1 when the multiplexer takes none of that type at all, 0 when
     // it is full. Type 0: the room left in total.
@@ -115,7 +115,7 @@ class QV_API QvEncodePipe : public QvCodec {
 
     virtual int setFilename(const Any& name);  // setParam("filename", ...)
     virtual Any getFilename();                 // getParam("filename")
-    // Whether open() makes the folder of the file name when it is missing.
+    // Whether open() makes a missing folder of the file name.
     virtual void setCreateOutFolder(bool on) = 0;
     virtual bool createOutFolder() const = 0;
 

@@ -29,7 +29,7 @@ class QvMuxer;
 struct QV_API QvFileMuxStream {
     int type = 0;                // qvVideoStream, qvAudioStream or qvSubpicStream
     Any file;                    // the name of a regular file that is not empty
-    Any codec;                   // name of the encoder that makes such data, as "rawvenc"
+    Any codec;                   // name of the encoder that makes such data: "rawvenc"
     Any extension;               // without the dot; not set: the encoder's, else that of the file
     QvFramerate framerate{0.0};  // of video
     int samplerate = 0;          // of sound, Hz
@@ -42,8 +42,8 @@ struct QV_API QvFileMuxStream {
     // "height" (pixels).
     AnyDict params;
 
-    // Bytes of a picture, or of one sample of all channels, of an encoder that writes these unchanged; 0 for
-    // coded data, and with a `problem` where the format is none.
+    // Bytes of a picture, or of one sample of all channels, if the encoder writes them unchanged. 0 for coded
+    // data; 0 with a text in `problem` for an invalid format.
     long long wholeBytes(std::string& problem) const;
 };
 
@@ -54,9 +54,9 @@ class QV_API QvFileMuxConfig {
 
     std::vector<QvFileMuxStream> streams;
     AnyDict output;  // parameters of the multiplexer, by name; all have to be taken
-    // Gets what part of all bytes is done, 0 to 1, after each unit; false stops. May be empty.
+    // Gets the part of all bytes that is done, 0 to 1, after each unit; returns false to stop. May be empty.
     std::function<bool(double part)> watch;
-    std::shared_ptr<QvCancel> cancel;  // a request stops; QvFileMux sets it
+    std::shared_ptr<QvCancel> cancel;  // its request stops the run; set by QvFileMux
 
     // "Video stream #1, 'clip.i420'", for messages. `index` is a place in `streams`.
     std::string place(std::size_t index) const;
@@ -74,8 +74,8 @@ class QV_API QvFileMux {
 
     QvFileMuxConfig& config() { return config_; }
 
-    // What of the configuration can be seen to be wrong before anything is written: 0, or
-    // QvStatus::invalidArgument with a text that names the stream and its file.
+    // Checks the configuration before anything is written: 0, or QvStatus::invalidArgument with a text that
+    // names the stream and its file.
     int check();
     // Multiplexes into a file, in the caller's thread. `muxer` is a module whose multiplexer answers
     // muxElementaryStreams, as "rawmux" and "rawavimux" do. 0 when all of it is written; `cancelled`; or a

@@ -31,7 +31,7 @@ AudioFilters restoreAudioFilters(const AnyVector& states);
 struct RateStages {
     std::unique_ptr<QvVideoFilter> pre;
     std::unique_ptr<QvVideoFilter> main;
-    bool behindScaler = false;  // must not run before the scaler, also when it reduces the rate
+    bool afterScaler = false;  // must not run before the scaler, also when it reduces the rate
 };
 
 RateStages chooseRateStages(const QvFramerate& in, const QvFramerate& out);

@@ -39,6 +39,6 @@ QV_API void qvColorBGR4ToARGB(const QvFrame& in, QvFrame& out);
 // A frame of packed 4:2:2 (YUYV, YUY2 or UYVY) to I422 of the same size, field by field if it is interlaced.
 QV_API void qvColorYUYVToI422(const QvFrame& in, QvFrame& out);
 // The same, then packed as v210 into `dest`: height lines of (width + 47) / 48 * 128 bytes, each sample
-// shifted up by two bits. Behind the last whole group of six pixels as many bytes are cleared as there are
-// pixels left; the rest of a line stays as it was. `scratch` becomes the I422 frame.
+// shifted up by two bits. After the last whole group of six pixels as many bytes are cleared as there are
+// pixels left; the rest of a line is unchanged. `scratch` becomes the I422 frame.
 QV_API void qvColorYUYVToV210(const QvFrame& in, unsigned char* dest, QvFrame& scratch);

@@ -26,7 +26,7 @@ class QV_API QvVideoFilter : public QvCodec {
     explicit QvVideoFilter(const QvModule* module = nullptr);
 
     int init() override;
-    // Beside the common parameters, "_previewMode" and "_totalFrames" are taken without effect.
+    // Besides the common parameters, "_previewMode" and "_totalFrames" are accepted without effect.
     int setParam(const char* name, const Any& value) override;
     void getParam(const char* name, Any& value) const override;
     int open() override = 0;
@@ -71,7 +71,8 @@ class QV_API QvAudioFilter : public QvCodec {
     explicit QvAudioFilter(const QvModule* module = nullptr);
 
     int init() override;
-    // Beside the common parameters, "_previewMode", "_totalFrames" and "vf_base" are taken without effect.
+    // Besides the common parameters, "_previewMode", "_totalFrames" and "vf_base" are accepted without
+    // effect.
     int setParam(const char* name, const Any& value) override;
     void getParam(const char* name, Any& value) const override;
     int open() override = 0;

@@ -17,9 +17,9 @@ class QV_API QvVProcessPipe : public QvVideoFilter {
 
     // Inserts the filter before the position and takes ownership of it. 0.
     virtual int addFilter(QvVideoFilter* filter, int position) = 0;
-    // Moves frames until an output frame is ready (0). With a null decoder the answer is -19 when the pipe
-    // needs input; with one, frames of that video stream are read, and what it answers other than 0 is
-    // returned as it stands.
+    // Moves frames until an output frame is ready (0). With a null decoder the result is -19 when the pipe
+    // needs input; with one, frames of that video stream are read, and a status of the decoder other than 0
+    // is returned unchanged.
     virtual int process(QvDecodePipe* decoder, int stream) = 0;
     virtual int removeFilter(int position) = 0;  // deletes the filter; 0
     virtual int clear() = 0;                     // deletes all filters; 0

@@ -41,7 +41,7 @@ class QV_API QvProcessUtil {
     // A null module name means "vprocess"; a name without module asserts. A pipe that fails to open asserts.
     static QvVProcessPipe* createVideoPipeAux(const VideoJobDescription& job, const char* moduleName,
                                               bool deferOpen);
-    // Tells the encoder what the pipe (null: none) already does and what it is to do itself.
+    // Sets in the encoder what the pipe (null: none) already does and what the encoder is to do itself.
     static void adjustVideoEncoder(const VideoJobDescription& job, QvVProcessPipe* pipe,
                                    QvEncodePipe* encoderPipe, int encoderStream);
 
@@ -65,7 +65,7 @@ class QV_API QvProcessUtil {
                                   long long from, long long to, const QvReadWatch& watch = {});
 
     // Frame numbers at one rate to another. The first element decides whether they are Int32 or Int64; `out`
-    // stays as it was when `in` is empty.
+    // is unchanged when `in` is empty.
     static void rescaleTimePoints(const AnyVector& in, const QvFramerate& fromRate, const QvFramerate& toRate,
                                   AnyVector* out);
     // What each stream has to be delayed by in smart rendering, in ticks: "video" and "audio", one Int64 a

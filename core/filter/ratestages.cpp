@@ -20,7 +20,7 @@ qvchain::RateStages weave(const QvFramerate& in, const QvFramerate& out) {
     QvFramerate fieldRate = qvchain::scaledRate(out, 2, 1);
     fieldRate.setInterlaced(0);
     qvchain::RateStages stages;
-    stages.behindScaler = true;
+    stages.afterScaler = true;
     if (!QvNum::equ(in.rate(), fieldRate.rate(), QvRatio::tolerance)) stages.pre = newStage(in, fieldRate);
     stages.main = newStage(fieldRate, out);
     stages.main->setParam("pulldown", 0);
@@ -31,7 +31,7 @@ qvchain::RateStages weave(const QvFramerate& in, const QvFramerate& out) {
 // 3:2 pulldown needs rates at exactly 4 to 5: film and NTSC meet at a rate between.
 qvchain::RateStages pulldown(const QvFramerate& in, const QvFramerate& out) {
     qvchain::RateStages stages;
-    stages.behindScaler = true;
+    stages.afterScaler = true;
     QvFramerate coded = in;
     if (in.is23p() && out.is60i()) coded = QvFramerate::f24p();
     if (in.is24p() && out.is59i()) coded = QvFramerate::f23p();

@@ -196,7 +196,7 @@ void VideoChain::append(QvVProcessPipe& pipe, VideoFilterPtr filter) const {
 void VideoChain::fill(QvVProcessPipe& pipe) {
     for (auto& filter : front_) append(pipe, std::move(filter));
     // A rate reduction runs first, so that no frame is scaled in vain.
-    if (reducesRate_ && !rate_.behindScaler) append(pipe, std::move(rate_.main));
+    if (reducesRate_ && !rate_.afterScaler) append(pipe, std::move(rate_.main));
     append(pipe, std::move(flipper_));
     append(pipe, std::move(cropper_));
     append(pipe, std::move(deinterlace_));

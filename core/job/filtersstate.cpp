@@ -95,7 +95,7 @@ int FiltersState::indexOf(const char* name, int after) const {
 AnyDict* FiltersState::findFilter(const char* name, const AnyDict* previous) const {
     const Any* fixed = hasFixedPlace(name) && get(name).isDict() ? &get(name) : nullptr;
     if (fixed && !previous) return const_cast<AnyDict*>(&fixed->asDict());
-    // Behind a fixed entry the first custom filter follows.
+    // After a fixed entry comes the first custom filter.
     bool reached = !previous || (fixed && previous == &fixed->asDict());
     for (const Any& filter : getVector(customKey)) {
         if (!hasName(filter, name)) continue;

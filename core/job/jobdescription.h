@@ -37,10 +37,10 @@ struct QV_API AudioConversion {
     std::string rateQuality = "standard";  // "quality" of `srconvert`: "standard", "high"
     std::string dither = "none";           // of the last `aquant`: "none", "triangular"
     bool clipWarning = true;               // of the last `aquant`: whether it warns of clipped samples
-    // After the end of the input the filters go on with silence, so that what they hold comes out, and a step
-    // of a link always has all samples that are due, also where the input has none at all. Off: the step in
-    // which the input ends is shorter, silence without filters follows, and an input that ends within the
-    // first step is a failure.
+    // After the end of the input the filters get silence, so that what they hold comes out, and a step of a
+    // link always has all samples that are due, even if the input has none at all. Off: the step in which the
+    // input ends is shorter, silence without filters follows, and an input that ends within the first step is
+    // a failure.
     bool padEnd = false;
 
     AudioConversion() = default;

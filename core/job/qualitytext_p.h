@@ -13,6 +13,6 @@ struct QualityFrame {
 std::string qvQualityLines(const std::vector<QualityFrame>& frames);
 // The same with a line of names first, and commas; "inf" for equal planes.
 std::string qvQualityCsv(const std::vector<QualityFrame>& frames);
-// {"frames":[{"frame":0,"bytes":812,"psnr_y":41.2,...},...],"mean":{"bytes":...,"psnr_y":...}}; the mean of
-// PSNR is that of the mean square errors, null stands for infinity.
+// {"frames":[{"frame":0,"bytes":812,"psnr_y":41.2,...},...],"mean":{"bytes":...,"psnr_y":...}}; the mean PSNR
+// is computed from the mean of the square errors; null means infinity.
 std::string qvQualityJson(const std::vector<QualityFrame>& frames);

@@ -26,7 +26,7 @@ class QV_API QvRatio {
 
     // Greatest common divisor, or 0 if a member is below 1.
     int gcd() const;
-    // Divides both members by gcd(); a ratio with a member below 1 stays as it is.
+    // Divides both members by gcd(); a ratio with a member below 1 is unchanged.
     void reduce();
 
     // Of the absolute values; 0 if one of them is 0. The divisor of two INT64_MIN is INT64_MIN.

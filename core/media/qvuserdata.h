@@ -8,7 +8,7 @@
 #include "core/arch/api.h"
 
 // A frame borrows its user data: they belong to the decoder or filter that set them and are valid until it
-// makes its next frame. Who keeps them longer copies the packets.
+// makes its next frame. To keep them longer, copy the packets.
 class QV_API QvUserData {
   public:
     int count() const { return static_cast<int>(packets_.size()); }

@@ -26,8 +26,7 @@ constexpr int farSize = 100000;
 constexpr double farRate = 999.0;
 constexpr double farAspect = 999.0;
 constexpr double sameAspect = 9.999999747378752e-05;  // 1e-4 in single precision
-// The most that a variable rate rises above its target, and what a steady rate of the same quality is below a
-// variable one's maximum.
+// Maximum of a variable rate to its target, and to the constant rate of the same quality.
 constexpr double variableHeadroom = 1.4;
 constexpr int shortestGop = 2;
 constexpr int defaultBits = 16;
@@ -47,7 +46,7 @@ struct Fit {
     }
 };
 
-// What is required of every encoder: without it the property stays as it is.
+// Every encoder has to have this parameter; without it the property is unchanged.
 void logMissing(const Fit& fit, const char* name) {
     qv_dbg()->warning("[Format match] %s does not say its '%s'", fit.encoder.name(), name);
 }
@@ -66,8 +65,8 @@ int clampByKeys(int value, const AnyDict& dict, const char* lowest, const char* 
 
 // --- Size.
 
-// The nearest width, then the nearest height of those at its distance. With widths on both sides of the input
-// at one distance the result may be a pair that the list does not have.
+// The nearest width, then the nearest height of the sizes whose width is as near. If widths above and below
+// the input are equally near, the result may be a pair that is not in the list.
 Pair nearestSize(const AnyVector& sizes, const Pair& wanted) {
     std::vector<Pair> near;
     Pair best(farSize, farSize);
@@ -151,7 +150,7 @@ QvFramerate nearestRate(const AnyVector& rates, const QvFramerate& wanted) {
     for (const auto& [exact, compareDf] : searches)
         if (const int i = wanted.findInVector(same, exact, compareDf); i >= 0)
             return same.at(i).asFramerate();
-    // Each frame twice is the next best.
+    // Next best is the double rate, which shows each frame twice.
     const AnyVector scan = ofSameScan(rates, wanted);
     if (const int i = doubled(wanted).findInVector(scan, false, false); i >= 0)
         return scan.at(i).asFramerate();
@@ -341,7 +340,7 @@ void fitVideo(int properties, const Fit& fit) {
             encoder.setParam("height", size->second);
         }
     }
-    // What rates an encoder can do may depend on the size.
+    // The rates of an encoder may depend on the size.
     if (properties & Matcher::framerate) setFramerate(fit, true);
     if (properties & Matcher::frameAspect) {
         if (const auto aspect = matchFrameAspect(fit)) {

@@ -1,6 +1,6 @@
 // A preset: what an output must be. A built-in one says which encoders and multiplexers a profile allows; a
-// user's adds the settings of the multiplexer and of each stream, and rests on the built-in one of the same
-// profile. The dictionary is the object, so presets store and read as plain values.
+// user's adds the settings of the multiplexer and of each stream, and refers to the built-in one of the same
+// profile. A preset is a dictionary, so it is stored and read like any value.
 //
 // Keys: "profile", "name", "custom" (0 built-in, 1 a user's), optional "shortName", "info", "disabled";
 // built-in: "videoCodecs", "audioCodecs", "muxers" (module names, the first is the default); a user's:
@@ -45,21 +45,22 @@ class QV_API QvPreset : public AnyDict {
     AnyVector programs() const;
     std::optional<QvPresetMeta> presetMeta() const;  // "PresetMeta", if it is there
 
-    // Whether an encode pipe takes this preset here: tried once, on a pipe of its own, and kept as the marks
+    // Whether this installation can use the preset: tried once, on a new encode pipe, and kept as the marks
     // "#valid" and "#err". A dictionary without "profile", "custom" or "name" is an assertion. error() is the
     // reason, invalid for a valid preset or one that was not tried.
     bool isValid();
     bool checkValid();  // tries again
     const Any& error() const { return get("#err"); }
     // Sets "info" to a line about format, video and sound, unless it holds a text already. It is read from
-    // `pipe`, to which this preset was applied, or from a pipe of its own.
+    // `pipe`, to which this preset was applied; null: from a new one.
     void createInfo(const QvEncodePipe* pipe = nullptr);
 
     // A copy whose profile, and that of its streams and multiplexer, is QvProfile::none. A stream of another
     // profile is an assertion, and so is a built-in preset.
     QvPreset toNone(int = 0) const;
 
-    // The modules that are allowed, by way of the base preset for a user's; empty when that is missing.
+    // The modules that are allowed. A user's preset takes them from the built-in one; empty if that is
+    // missing.
     AnyVector muxers() const { return allowed("muxers"); }
     AnyVector videoCodecs() const { return allowed("videoCodecs"); }
     AnyVector audioCodecs() const { return allowed("audioCodecs"); }

@@ -20,7 +20,7 @@ namespace {
 // Blocks of this size end at its multiples in the file: a page that is written in two pieces costs twice.
 constexpr size_t gatheredBytes = size_t{1} << 16;
 
-// A file of samples, gathered into large blocks: those of a turn are a few kilobytes.
+// A file of samples that is written in large blocks: one access unit has only a few kilobytes.
 class SampleFile {
   public:
     bool open(const QvWideString& name, const std::shared_ptr<QvCancel>& cancel) {
@@ -81,7 +81,7 @@ struct QvBsSplitAudio::Wav {
     std::vector<std::unique_ptr<File>> files;  // one for each channel, or the only one
     QvPcm work;                                // interleaved samples of one access unit; in split mode only
     AnyVector channelPointers;
-    std::vector<unsigned char> chunks;  // to follow the samples, as they stand in a file
+    std::vector<unsigned char> chunks;  // complete chunks, to be written after the samples
     bool mayBeRf64 = false;
     unsigned carried = 0;  // bytes of an incomplete sample at the head of the ring
 
@@ -173,7 +173,7 @@ std::array<unsigned char, wavHeaderBytes> QvBsSplitAudio::streamHeader() {
     return wavHeader(format, {.fileBytes = bytes, .mayBeRf64 = wav_->mayBeRf64});
 }
 
-// False for what is no chunk.
+// Reads "rf64" and "chunks"; false if an entry is no chunk.
 bool QvBsSplitAudio::takeChunks() {
     constexpr size_t idBytes = 4, headBytes = 8;
     wav_->mayBeRf64 = params().get("rf64").isTrue();
@@ -195,7 +195,7 @@ bool QvBsSplitAudio::takeChunks() {
     return true;
 }
 
-// Appends the file to the list, with room for the header in it.
+// Appends the file to the list, and writes room for the header into it.
 bool QvBsSplitAudio::openFile(const Any& name) {
     const std::string narrow = qv_os_name(name);
     auto& entry = *wav_->files.emplace_back(std::make_unique<Wav::File>());
@@ -326,7 +326,7 @@ bool QvBsSplitAudio::writeItem(int file, const unsigned char* data, unsigned byt
     return false;
 }
 
-// They begin at an even place.
+// Chunks begin at an even offset.
 bool QvBsSplitAudio::writeChunks(int file) {
     auto& entry = *wav_->files[static_cast<size_t>(file)];
     const auto& chunks = wav_->chunks;

@@ -1,6 +1,6 @@
-// Streams of the elementary stream export. Each is either a plain file, or takes the encoder's output apart:
-// one file for each picture, or WAV files. They write in the encoder's thread, when it reports an access
-// unit.
+// The output streams of the elementary stream export. Each is either a plain file, or splits the encoder's
+// output: a file for each picture, or WAV files. They write in the encoder's thread, when it reports an
+// access unit.
 //
 // Failures to open or write are logged, stop the ring, so that the encoder gets no more room, and stay in
 // ioError().
@@ -20,23 +20,23 @@ class PictureQueue;
 // and so on; "nrDigits" (Int32), width of the number, with zeros in front; "png" true to write each access
 // unit as a PNG picture, which "width", "height" and "FOURCC" describe. "chunk" must hold a whole picture
 // then, and formats other than BGR3 need the module "scaler". "parallel" true: PNG pictures are packed on the
-// engine's pool of threads, several at once. Their files come in their order, but later than their units: a
-// failure stops the ring with the next unit, or is in ioError() after destroy(0); destroy(1) leaves out what
-// is not written yet.
+// engine's pool of threads, several at once. The files are written in order, but later than their units: a
+// failure stops the ring at the next unit, or is in ioError() after destroy(0); destroy(1) drops what is not
+// written yet.
 class QV_API QvBsSplitVideo : public QvBufStreamFifoCb {
   public:
     explicit QvBsSplitVideo(QvCodec* owner = nullptr);
     ~QvBsSplitVideo() override;
 
     using QvBufStream::init;
-    // Asserts that "outfilename" is text. -1 for pictures that can't be.
+    // Asserts that "outfilename" is text. -1 for an impossible picture format.
     int init(const AnyDict& params) override;
     void destroy(int abort) override;
     void flush() override;
     bufstream* input() override;
     bufstream* output() override;
     int registerObserver(QvAuxInfoObserver* observer) override;
-    int unregisterObserver(QvAuxInfoObserver* observer) override;  // a listed one still hears of a plain file
+    int unregisterObserver(QvAuxInfoObserver* observer) override;  // a plain file still calls one in the list
     int unregisterAllObservers() override;
     TPtrList<QvAuxInfoObserver>* observers() override;
 
@@ -75,10 +75,10 @@ class QV_API QvBsSplitVideo : public QvBufStreamFifoCb {
 // The header is written when STREAM_END_CODE comes; before that the file has 80 zero bytes in its place. Size
 // fields that a file beyond 4 GiB can't state are 0xFFFFFFFF, with a warning; the samples are all there.
 //
-// Parameters that are off at first add to that. "rf64" true: the header of such a large file is that of RF64
-// instead, without a warning. "channelMask" (Int32 or Int64): the places of the channels, which the header
-// states unless the file is RF64 or a split. "chunks" (see QvWavChunks): they follow the samples, in every
-// file of a split; a stream, which has to end with its samples, gets none.
+// These parameters are off by default. "rf64" true: such a large file gets an RF64 header instead, without a
+// warning. "channelMask" (Int32 or Int64): the speaker positions, which the header states unless the file is
+// RF64 or a split. "chunks" (see QvWavChunks): they follow the samples, in every file of a split; a stream,
+// which has to end with its samples, gets none.
 //
 // A pipe, a socket or a device gets its header at once. Its sizes are those of "expectedSamples" (Int32 or
 // Int64, of each channel), or 0xFFFFFFFF without that: readers take the stream to its end then.

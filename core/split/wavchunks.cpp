@@ -71,7 +71,7 @@ uint64_t timeReference(std::string_view bext) {
 }
 int versionOf(std::string_view bext) { return static_cast<int>(u32(bext, bextVersion) & 0xFFFF); }
 
-// --- iXML: few elements count, and the rest has to stay as it is.
+// --- iXML: few elements count, and the rest must not change.
 
 std::optional<std::pair<size_t, size_t>> elementIn(std::string_view xml, const std::string& name) {
     const std::string begin = "<" + name + ">", end = "</" + name + ">";

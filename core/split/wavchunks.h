@@ -26,7 +26,7 @@ class QV_API QvWavChunks {
         bool changed = false;    // the sound itself is another, so what was measured of it is void
     };
     // The chunks for a file with that part: time references and cue points move, points outside it go, and
-    // their labels with them. Loudness in "bext" is void for less than the whole. Others stay as they are, as
+    // their labels with them. Loudness in "bext" is void for less than the whole. Others are unchanged, as
     // does what is damaged.
     static AnyVector ofPart(const AnyVector& chunks, const Part& part);
 

@@ -39,7 +39,7 @@ class QV_API QvBufStream {
     QvBufStream& operator=(const QvBufStream&);
 
     virtual ~QvBufStream();
-    virtual int init();  // with the parameters as they stand
+    virtual int init();  // with the current parameters
     // Ends what is open, takes `params` as the parameters and starts anew. 0 or a status.
     virtual int init(const AnyDict& params);
     virtual void destroy(int abort);
@@ -70,9 +70,9 @@ class QV_API QvBufStream {
     void lock();  // recursive
     void unlock();
 
-    // The first thing that went wrong with reading or writing since init, files included that were closed
-    // by flush() or destroy(): an errno value, 0 if nothing did, and what, which file and why ("" if
-    // nothing). Whoever gives a file its final name asks this after destroy().
+    // The first failure to read or write since init, also of files that flush() or destroy() has closed: an
+    // errno value, 0 if none, and a text that says what failed, for which file and why, "" if none. To be
+    // asked after destroy(), before a file gets its final name.
     int ioError() const;
     std::string ioErrorText() const;
     // Bytes that the system has taken since init, in files that are closed again.

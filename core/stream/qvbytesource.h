@@ -6,11 +6,11 @@
 //     decoder->setParam("source", qvSourceValue(source.get()));
 //     decoder->open();
 //     ...
-//     decoder->close();                        // from here on the source may go
+//     decoder->close();                        // now the source may be deleted
 //
-// The parameter is a borrowed pointer: the source outlives the use of it, which ends when the decoder is
-// closed. With a source, "filename" is only a name: for messages, and for decoders that look at its
-// extension. An invalid value goes back to reading the file. QvDecFactory::decodeSource does all of this.
+// The parameter is a borrowed pointer: the source has to exist until the decoder is closed. With a source,
+// "filename" is only a name: for messages, and for decoders that look at its extension. With an invalid value
+// the decoder reads the file again. QvDecFactory::decodeSource does all of this.
 //
 // A source belongs to the thread that drives its decoder, and to one decoder at a time. Callbacks run on that
 // thread, within open, reads and seeks.
@@ -25,13 +25,13 @@
 #include "core/arch/api.h"
 #include "core/value/any.h"
 
-// Bytes, counted from 0, that are read from a position on. To make a source, use a maker below, or derive and
-// define the protected operations. The public operations are for decoders: whatever the source does, they
-// return, throw nothing, and keep the reason of a failure.
+// Bytes that are read from a position on; the first has the position 0. To make a source, use a maker below,
+// or derive and define the protected operations. The public operations are for decoders: whatever the source
+// does, they return, throw nothing, and keep the reason of a failure.
 class QV_API QvByteSource {
   public:
     static constexpr long long unknown = -1;  // size
-    // A reader that has to hold all of a source takes no more than this of one of unknown size.
+    // A reader that keeps a whole source in memory takes no more than this from one of unknown size.
     static constexpr long long mostUnknown = 64LL << 20;
 
     QvByteSource() = default;
@@ -43,17 +43,18 @@ class QV_API QvByteSource {
     // The next bytes, directly into the caller's memory. Fewer than `count` only at the end or after a
     // failure; problem() says which. After a failure nothing is read until seek succeeds.
     std::size_t read(void* to, std::size_t count);
-    // Moves to a byte from the start. False for a negative one and for a source that can't; the position it
-    // has anyway is always allowed. A position beyond the end is one where nothing is read.
+    // Moves to a byte from the start. False for a negative position and for a source that can't move, except
+    // to where it is. A position beyond the end is allowed; nothing is read there.
     bool seek(long long position);
     long long position() const { return position_; }
-    // Bytes, or `unknown`, also for what no size can be (above 2^60).
+    // Bytes, or `unknown`; also `unknown` for an impossible size (above 2^60).
     long long size();
     bool seekable() const;
-    // Ends the use of it: nothing can be read after that. Done once; not by the destructor.
+    // Ends its use and releases what it holds; nothing can be read after that. The second call does nothing.
+    // The destructor does not call it.
     void close();
 
-    bool failed() const { return failed_; }  // a read or a seek did, and no seek succeeded since
+    bool failed() const { return failed_; }  // a read or a seek failed, and no seek succeeded since
     // Why there were fewer bytes than asked for, as a part of a sentence: what the source reported, or that
     // it ends before its size. "" for an end at its size, or at an unknown one.
     std::string problem();
@@ -81,13 +82,14 @@ class QV_API QvByteSource {
 
 // The parameter's name.
 inline constexpr const char* qvSourceParam = "source";
-// A source as the value of a parameter; invalid for null. And back: null for what is no pointer.
+// A source as the value of a parameter; invalid for null. The second is the inverse: null for a value that is
+// no pointer.
 QV_API Any qvSourceValue(QvByteSource* source);
 QV_API QvByteSource* qvSourceOf(const Any& value);
 
 // --- Makers. The caller owns the result.
 
-// A whole block. The first borrows the memory, which then outlives the source; the second has it.
+// A block of memory. The first borrows it: it has to exist as long as the source. The second owns it.
 QV_API std::unique_ptr<QvByteSource> qvBlockSource(const void* data, std::size_t bytes);
 QV_API std::unique_ptr<QvByteSource> qvBlockSource(std::vector<unsigned char> data);
 
@@ -96,12 +98,12 @@ QV_API std::unique_ptr<QvByteSource> qvBlockSource(std::vector<unsigned char> da
 // be sought.
 QV_API std::unique_ptr<QvByteSource> qvFileSource(const Any& name, std::size_t bufferBytes = 64 * 1024);
 
-// Operations of the application's own. What they refer to outlives the source.
+// Operations of the application's own. What they refer to has to exist as long as the source.
 struct QvSourceCallbacks {
     // Puts 1 to `count` bytes to `to` and returns their number; 0 at the end; below 0 for a failure. It may
     // throw: that is a failure, too.
     std::function<long long(void* to, std::size_t count)> read;
-    // Moves to a byte from the start; false for a failure. Empty: the bytes come in their order only.
+    // Moves to a byte from the start; false for a failure. Empty: the source can't be sought.
     std::function<bool(long long position)> seek = {};
     std::function<long long()> size = {};  // bytes. Empty, or below 0: unknown
     std::function<void()> close = {};      // called once, when the source is closed or goes. May be empty

@@ -23,7 +23,7 @@ class StdFile {
     bool openOutput(const QvWideString& name, const std::shared_ptr<QvCancel>& cancel);
     // Opened by openOutput and no file: it can't be sought, nor opened again to change what was written.
     bool isStream() const { return isStream_; }
-    // Each write goes to the system as it is; to be called before the first.
+    // Passes each write to the system at once; to be called before the first.
     void setUnbuffered();
     bool isOpen() const { return file_ != nullptr; }
     bool write(const void* data, size_t bytes) { return writeSome(data, bytes) == bytes; }

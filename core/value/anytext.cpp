@@ -92,7 +92,7 @@ Any replaced(const std::vector<Unit>& text, const std::vector<Unit>& find, const
         return qvTextOf(QvWideView(result));
 }
 
-// The characters as they stand, without regard to what they encode.
+// The characters unchanged, without regard to what they encode.
 std::vector<unsigned short> widened(const Any& value) {
     if (value.isWString()) return unitsOf<unsigned short>(value);
     std::vector<unsigned short> units;

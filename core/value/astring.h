@@ -4,8 +4,8 @@
 #include "core/arch/api.h"
 
 // The five functions that AString is built on. They work on the three parts of such a string: the inline
-// buffer `mbuf` of bufsize + 1 bytes, the pointer `mptr` to the text, and the flag `mflag`, which tells
-// whether the pointer is to an owned heap copy. A null source counts as the empty text.
+// buffer `mbuf` of bufsize + 1 bytes, the pointer `mptr` to the text, and the flag `mflag`: whether the
+// pointer is to an owned heap copy. A null source counts as the empty text.
 //
 // bufsize > 0: inline. `mbuf` must be given; at most bufsize characters are kept, zero-padded and terminated.
 // bufsize = 0: the heap copy if `owned`, else an alias of `src`, which must then outlive the string.

@@ -29,7 +29,7 @@ T parseInteger(std::string_view text) {
     return text[0] == '-' ? std::numeric_limits<T>::min() : std::numeric_limits<T>::max();
 }
 
-// Tells for a decimal number outside the range of a double on which side it lies: below 1, or above.
+// For a decimal number that no double can hold: true if it is too small (below 1), false if too large.
 inline bool isTiny(std::string_view number) {
     const std::size_t mark = std::min(number.find_first_of("eE"), number.size());
     const std::string_view digits = number.substr(0, mark);

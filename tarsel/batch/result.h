@@ -1,4 +1,4 @@
-// What became of the tasks of a batch, for those who show it.
+// What became of the tasks of a batch, in the form in which it is shown.
 #pragma once
 
 #include <ctime>

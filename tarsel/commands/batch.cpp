@@ -245,9 +245,9 @@ void addBatch(CommandLine& line, Signals& signals, const std::string& version,
     fresh.action([name, given] { BatchFile(*name).make(given->overwrite); });
     addBatchAdd(batch, signals, name, words);
     showing("list", "Show the tasks", list);
-    withTasks("enable", "Let the next run include tasks",
+    withTasks("enable", "Let runs include tasks again",
               [](const BatchFile& file, const Words& tasks) { enable(file, tasks, true); });
-    withTasks("disable", "Keep tasks in the list, and let runs pass them over",
+    withTasks("disable", "Keep tasks in the list, but don't run them",
               [](const BatchFile& file, const Words& tasks) { enable(file, tasks, false); });
     Command moving = batch.command("move", "Put a task at another place");
     moving.arguments("TASK", given->tasks, "The task, then the number that it is to have", 2);
@@ -256,7 +256,7 @@ void addBatch(CommandLine& line, Signals& signals, const std::string& version,
         move(BatchFile(*name), given->tasks[0], given->tasks[1]);
     });
     withTasks("remove", "Take tasks out of the list", removeTasks);
-    Command checking = batch.command("check", "Find out whether the tasks can be run");
+    Command checking = batch.command("check", "Check whether the tasks can be run");
     checking.action([name] { Check(BatchFile(*name)).run(); });
     showing("status", "Show what was done and what is left", status);
     addBatchRun(batch, signals, name, version, std::move(before));

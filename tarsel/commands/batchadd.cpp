@@ -215,7 +215,7 @@ void addOptions(Command& command, Given& given) {
     command.list("--files", given.files, "In the place of INPUTs: a task for each file; -o has {name} in it",
                  "PATTERN");
     command.list("--task", given.tasks, "A job that transcode --save-task has written", "FILE");
-    command.flag("-q,--quiet", given.job.quiet, "Say nothing but errors");
+    command.flag("-q,--quiet", given.job.quiet, "Print nothing but errors");
 }
 
 }  // namespace

@@ -149,11 +149,11 @@ void addBatchRun(Command& batch, Signals& signals, const ListName& list, const s
                    "FILE.html|.json");
     given->progress.add(command);
     command.flag("--allow-post", given->allowPost, "Run the commands that tasks have for afterwards");
-    command.flag("--accept-partial", given->acceptPartial, "Take what is there of damaged inputs");
+    command.flag("--accept-partial", given->acceptPartial, "Accept damaged inputs and take what can be read");
     command.flag("--strict", given->strict, "Let a task fail if there is a warning");
     addThreads(command, given->threads);
     given->outputs.add(command);
-    command.flag("-q,--quiet", given->quiet, "Say nothing but errors");
+    command.flag("-q,--quiet", given->quiet, "Print nothing but errors");
     command.action(
         [&signals, list, given, before] {
             const BatchFile file(*list);

@@ -210,7 +210,7 @@ void addFrame(CommandLine& line, Signals& signals, const std::string& version) {
     command.flag("--strict", given->strict, "Write nothing if there is a warning");
     addThreads(command, given->threads);
     command.flag("--accept-partial", given->effects.acceptPartial,
-                 "Take what is there of a damaged input or of damaged subtitles");
+                 "Accept a damaged input or subtitles and take what can be read");
     given->outputOptions.add(command);
     given->progress.add(command);
     command.action([given] { frame(*given); },

@@ -240,7 +240,7 @@ void mix(const Given& given) {
 }  // namespace
 
 void addMix(CommandLine& line, Signals& signals) {
-    Command command = line.command("mix", "Make a file that stands for a mix of sounds, or show one");
+    Command command = line.command("mix", "Describe a mix of sounds in a file, or show one");
     auto given = std::make_shared<Given>();
     given->signals = &signals;
     command.argument("FILE", given->file, "A mix to show or to write anew", Need::optional);

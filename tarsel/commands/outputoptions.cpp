@@ -33,7 +33,7 @@ void OutputOptions::add(Command& command) {
     command.flag("-n,--keep", keep, "Keep existing outputs: the run then does nothing, with status 0");
     command.flag("--no-sync", noSync, "Don't wait until the disk has the outputs");
     command.option("--stale", stale,
-                   "Age after which what another host's run left goes: 90m, 12h, 30d, never (7d)", "AGE");
+                   "Age at which another host's work folder is removed: 90m, 12h, 30d, never (7d)", "AGE");
 }
 
 OutputPolicy OutputOptions::policy() const {

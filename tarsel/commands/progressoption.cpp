@@ -6,7 +6,7 @@
 
 void ProgressOption::add(Command& command) {
     command.option("--progress", text,
-                   "What is shown meanwhile: objects to FD or FILE, or stderr; or a line each SECONDS",
+                   "How progress is shown: objects to FD or FILE, or stderr; or a line each SECONDS",
                    "auto|json[:FD|:FILE]|log[:SECONDS]|none", {"auto", "json", "log", "none"});
 }
 

@@ -43,12 +43,12 @@ void addRun(CommandLine& line, Signals& signals, const std::string& version) {
                    "FILE");
     command.flag("--allow-post", given->allowPost, "Run the command that the task has for afterwards");
     given->progress.add(command);
-    command.flag("--accept-partial", job.acceptPartial, "Take what is there of a damaged input");
+    command.flag("--accept-partial", job.acceptPartial, "Accept a damaged input and take what can be read");
     command.flag("--strict", job.strict, "Let the job fail if there is a warning");
     addThreads(command, given->threads);
     command.flag("--dry-run", job.dryRun, "Print the plan and do nothing");
     given->outputs.add(command);
-    command.flag("-q,--quiet", job.quiet, "Say nothing but errors");
+    command.flag("-q,--quiet", job.quiet, "Print nothing but errors");
     command.action([&signals, given] { run(*given, signals); },
                    [given, version] {
                        given->progress.open(given->output, {given->task}, given->outputs.overwrite, version);

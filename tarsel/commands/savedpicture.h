@@ -1,4 +1,4 @@
-// A picture that a command writes beside what it prints.
+// A picture that a command writes in addition to what it prints.
 #pragma once
 
 #include <memory>

@@ -112,7 +112,7 @@ void addJobOptions(Command& command, GivenJob& given, Need inputs) {
     command.option("--format", job.format, "What to write, in the place of an extension: wav, raw, ...",
                    "EXT", outputFormats());
     command.option("--preset", job.presetName, "What the output is to be, see 'tarsel presets list'", "NAME");
-    command.flag("--match", job.match, "Fit what the preset allows to the INPUT");
+    command.flag("--match", job.match, "Choose the values nearest to the INPUT that the preset allows");
     command.flag("--join", job.join,
                  "The INPUTs are segments NAME[@FROM-TO], one after the other; A+B is read side by side");
     command.list("--cut", job.cuts, "A part of the INPUTs; several are joined in this order", "FROM-TO");
@@ -135,7 +135,7 @@ void addJobOptions(Command& command, GivenJob& given, Need inputs) {
                    "A command run afterwards; %i and %o stand for the inputs and outputs, %o1 for the first",
                    "CMD");
     command.flag("--split-channels", job.splitChannels, "One WAV file a channel");
-    command.flag("--accept-partial", job.acceptPartial, "Take what is there of a damaged input");
+    command.flag("--accept-partial", job.acceptPartial, "Accept a damaged input and take what can be read");
     addSoundOptions(command, job.sound);
     addEffectOptions(command, job.effects);
 }
@@ -156,7 +156,7 @@ void addTranscode(CommandLine& line, Signals& signals, const std::string& versio
     addThreads(command, given->threads);
     command.flag("--dry-run", job.dryRun, "Print the plan and do nothing");
     given->outputs.add(command);
-    command.flag("-q,--quiet", job.quiet, "Say nothing but errors");
+    command.flag("-q,--quiet", job.quiet, "Print nothing but errors");
     command.action([&signals, given] { transcode(*given, signals); },
                    [given, version] { openEvents(*given, version); });
 }

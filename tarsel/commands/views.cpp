@@ -122,8 +122,7 @@ void views(const Given& given) {
 }  // namespace
 
 void addViews(CommandLine& line, Signals& signals) {
-    Command command =
-        line.command("views", "Make a file that stands for several pictures as views or as one, or show one");
+    Command command = line.command("views", "Describe several views of a picture in a file, or show one");
     auto given = std::make_shared<Given>();
     given->signals = &signals;
     command.argument("FILE", given->file, "Views to show or to write anew", Need::optional);

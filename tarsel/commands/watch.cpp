@@ -90,27 +90,28 @@ void addWatch(CommandLine& line, Signals& signals, const std::string& version) {
                  "NAME[:OUTFOLDER]");
     command.option("-o,--output", given->base,
                    "Where presets without an OUTFOLDER get folders of their names (FOLDER-out)", "FOLDER");
-    command.flag("--keep", given->keep, "Leave inputs where they are (so it is without --move and --delete)");
+    command.flag("--keep", given->keep, "Leave inputs where they are (the default)");
     command.option("--move", given->moveTo, "Move inputs there once all outputs are made and checked",
                    "FOLDER");
     command.flag("--delete", given->remove, "Delete inputs once all outputs are made and checked");
     command.option("--failed", given->failedTo,
-                   "Move inputs there that can't be made, each with a text that says why", "FOLDER");
+                   "Move inputs that can't be transcoded there, each with a text that says why", "FOLDER");
     command.flag("--retry-failed", given->retryFailed, "Take files again that failed in an earlier run");
-    command.flag("--once", given->once, "Make what is there, and end");
+    command.flag("--once", given->once, "Transcode the files that are there, and end");
     command.option("--settle", given->settle, "How long a file has to stay unchanged before it is taken (2)",
                    "SECONDS");
     command.option("--scan", given->scan,
                    "How often the whole folder is looked through (60; 5 on a network file system)",
                    "SECONDS");
-    command.option("--state", given->state, "Where it is kept what was done (FOLDER/.watch.tarsel)", "FILE");
+    command.option("--state", given->state, "The record of what was done (FOLDER/.watch.tarsel)", "FILE");
     command.option("--raw", given->raw, "Format of raw inputs: size=WxH,pixel=FORMAT,rate=R", "K=V,...");
-    command.flag("--accept-partial", given->acceptPartial, "Take what is there of a damaged input");
+    command.flag("--accept-partial", given->acceptPartial,
+                 "Accept a damaged input and take what can be read");
     command.flag("--strict", given->strict, "Let a file fail if there is a warning");
     command.flag("-y,--overwrite", given->overwrite, "Overwrite existing outputs");
     addThreads(command, given->threads);
     given->progress.add(command);
-    command.flag("-q,--quiet", given->quiet, "Say nothing but failures");
+    command.flag("-q,--quiet", given->quiet, "Print nothing but failures");
     command.action([&signals, given] { watch(*given, signals); },
                    [given, version] { given->progress.open("", {given->state}, given->overwrite, version); });
 }

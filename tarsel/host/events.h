@@ -12,7 +12,7 @@ enum class Level { note, warning, error };
 // one, and is nothing else where these go to the standard error.
 void tell(Level level, const std::string& line);
 
-// The figures of a job, as they stand in an object.
+// The figures of a job that an object holds.
 struct JobFigures {
     double percent = 0, etaSeconds = -1;       // negative: unknown
     double fps = -1, speed = -1;               // likewise

@@ -14,8 +14,8 @@ struct FileStamp {
 // Of what a symbolic link leads to. Nothing for a file that is not there or is no regular one.
 std::optional<FileStamp> stampOf(const std::string& name);
 
-// 32 hexadecimal digits of all bytes of a file: MD5 over the MD5 of each block. It is no proof against those
-// who want to deceive it. Throws Failure (input).
+// 32 hexadecimal digits of all bytes of a file: MD5 over the MD5 of each block. It is no protection against
+// forgery. Throws Failure (input).
 std::string digestOfFile(const std::string& name);
 // MD5 of a text, 32 hexadecimal digits.
 std::string digestOfText(const std::string& text);

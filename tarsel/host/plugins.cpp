@@ -138,13 +138,13 @@ bool loadOwnPlugins() {
 void loadPlugins(const std::string& folder) {
     watchEnds();
     const CrashWatch watch;
-    const auto told = static_cast<std::ptrdiff_t>(qv_registry()->pluginFailures().size());
+    const auto known = static_cast<std::ptrdiff_t>(qv_registry()->pluginFailures().size());
     if (const std::string why = whyNoFolder(folder); !why.empty())
         warn(lineOf(Msg::pluginsNoFolder, {folder, why}));
     else if (qv_registry()->scanFolder(Any(folder.c_str())) != QvStatus::ok)
         warn(lineOf(Msg::pluginsAbsent, {folder}));
     const std::vector<QvPluginFailure>& all = qv_registry()->pluginFailures();
-    tell(folder, {all.begin() + std::min(told, std::ssize(all)), all.end()});
+    tell(folder, {all.begin() + std::min(known, std::ssize(all)), all.end()});
 }
 
 int pluginWarnings() { return g_warnings; }

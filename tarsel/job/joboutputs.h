@@ -47,9 +47,9 @@ class JobOutputs {
 
     // Gives all files their names; see Outputs::commit.
     void commit();
-    // Ends what is going on with them, from any thread; see Transaction::leave.
+    // Ends all work on them, from any thread; see Transaction::leave.
     bool leave() { return transaction_->leave(); }
-    // Those of the output, after commit.
+    // The final names of the output, after commit.
     std::vector<std::string> names() const;
     // The final name of a file in the hidden folder.
     std::string finalName(const std::filesystem::path& written) const;

@@ -47,7 +47,7 @@ void JobRun::run() {
     const std::vector<std::string> names = parts_.outputs.names();
     Events::get().wrote(names);
     if (options_.post.empty()) signals_.complete();
-    // The result is there, whether or not there is memory to say so.
+    // The result is complete, so a lack of memory for these lines is no failure.
     try {
         if (!options_.quiet) warnings_.show();
         if (!options_.quiet)

@@ -33,7 +33,7 @@ class JobTranscoder : public QvTranscoder {
     void report();
 
     // After the run: what was shown last, the frames or samples of each stream of the plan, and why a filter
-    // could not do its work; the others went on without it.
+    // could not do its work, without which the job continued.
     const ProgressState& last() const { return last_; }
     const std::vector<long long>& written() const { return written_; }
     // Values that went beyond full scale in each stream of the plan.

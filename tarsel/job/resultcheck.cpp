@@ -78,7 +78,7 @@ void checkTaken(const JobParts& parts, long long written) {
                       {parts.plan.output.name, std::to_string(taken), std::to_string(wanted)});
 }
 
-// In a join silence stands for what a sound lacks, so that the count is right all the same.
+// In a join missing sound is filled with silence, so the count does not show that it is missing.
 void checkJoined(const JobParts& parts, bool acceptPartial, Warnings& warnings) {
     if (!parts.stored || !parts.stored->isJoin()) return;
     for (const auto& source : parts.sources) {

@@ -58,7 +58,7 @@ void addEffectOptions(Command& command, EffectOptions& options) {
     command.option("--matrix", options.matrix, "YUV matrix of the output, or of input and output",
                    "[IN:]601|709", {"601", "709", "601:709", "709:601"});
     command.flagOrValue("--deinterlace", options.deinterlace,
-                        "top (unless said), bottom, bob, double or reverse", "[=METHOD]",
+                        "top (the default), bottom, bob, double or reverse", "[=METHOD]",
                         deinterlaceMethods());
     command.option("--crop", options.crop, "The part to keep; -X and -Y count from the right and the bottom",
                    "WxH[+X+Y]|W:H");
@@ -74,7 +74,7 @@ void addEffectOptions(Command& command, EffectOptions& options) {
         "Burn in the timecode of the input, or from START on; keys start, mode=frames, x, y, size, "
         "color, font",
         "[=START|K=V,...]");
-    command.option("--fade", options.fade, "Fade in from black over IN, and to black over OUT, or IN as well",
+    command.option("--fade", options.fade, "Fade in from black for IN, and out to black for OUT, or IN again",
                    "IN[,OUT]");
     command.group("");
     command.list(

@@ -33,7 +33,7 @@ void addSoundOptions(Command& command, SoundOptions& options) {
                  "Make the sound louder, or softer with a minus; a:N= is one of several sounds, from 0 on",
                  "[a:N=]DB");
     command.flagOrValue("--normalize", options.normalize,
-                        "Bring the loudness to LUFS (-23 unless said), or the peak or the RMS to dBFS",
+                        "Bring the loudness to LUFS (-23 by default), or the peak or the RMS to dBFS",
                         "[=[loudness|peak|rms:]LEVEL]", {"-23", "-16", "peak:-1", "rms:-20"});
     command.option("--delay", options.delay, "Let the sound come later, or earlier with a minus: SS.mmm, 3f",
                    "TIME");
@@ -43,7 +43,7 @@ void addSoundOptions(Command& command, SoundOptions& options) {
         "0 of sound 1",
         "OUT,OUT,...");
     command.choice("--dither", options.dither,
-                   "Noise where the sound is rounded to 16 or 8 bits; triangular unless said",
+                   "Noise where the sound is rounded to 16 or 8 bits; triangular by default",
                    {"triangular", "none"});
     command.group("");
 }

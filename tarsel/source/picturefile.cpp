@@ -10,7 +10,7 @@
 namespace {
 
 // Whether the user log got a message of a type, QvLogMask, after its first `before`.
-bool told(int before, int type) {
+bool wasLogged(int before, int type) {
     AnyVector messages;
     qv_log()->getAll(messages);
     for (int i = before; i < messages.size(); ++i)
@@ -27,8 +27,8 @@ void requirePicture(const std::string& name) {
     QvFrame picture;
     const int result = QvImage::loadFrame(picture, Any(name.c_str()));
     // What opens and is a PNG fails for memory only.
-    if (told(messages.size(), QvLogMask::error)) throw std::bad_alloc();
+    if (wasLogged(messages.size(), QvLogMask::error)) throw std::bad_alloc();
     if (result != QvStatus::ok) throw failure(Msg::pictureNoPng, {name});
-    if (!picture.inited() || told(messages.size(), QvLogMask::warning))
+    if (!picture.inited() || wasLogged(messages.size(), QvLogMask::warning))
         throw failure(Msg::pictureDamaged, {name});
 }

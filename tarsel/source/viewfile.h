@@ -17,5 +17,5 @@ bool isCardFolder(const std::string& name);
 // Its clip. Throws Failure (input).
 std::unique_ptr<QvDecodePipe> openCard(const std::string& folder);
 
-// The files that a decoder reads beside the one by which it was opened.
+// The files that a decoder reads in addition to the one by which it was opened.
 std::vector<std::string> inputFilesOf(const QvDecodePipe& decoder);

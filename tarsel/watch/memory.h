@@ -33,7 +33,7 @@ struct WatchedFile {
     bool isCertainly(const FileFacts& now) const;
 };
 
-// One line of the memory and back. A line that is none gives a record without a name.
+// One line of the memory and back. An invalid line gives a record without a name.
 std::string lineOf(const WatchedFile& file);
 WatchedFile watchedFileOf(const std::string& line);
 

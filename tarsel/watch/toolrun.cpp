@@ -104,19 +104,19 @@ ToolResult ToolRun::ask(const std::vector<std::string>& arguments) {
 ToolResult ToolRun::work(std::vector<std::string> arguments,
                          const std::function<void(const ProgressState&)>& progress) {
     arguments.insert(arguments.end(), {"--progress", "json"});
-    ToolResult told;
+    ToolResult reported;
     const ToolResult ended = run(arguments, ToolProcess::Stream::error, [&](std::string& text) {
         size_t at = 0;
         for (size_t end = 0; (end = text.find('\n', at)) != std::string::npos; at = end + 1)
-            takeObject(text.substr(at, end - at), told, progress);
+            takeObject(text.substr(at, end - at), reported, progress);
         text.erase(0, at);
     });
-    told.status = ended.status;
-    if (told.status < 0)
-        told.failure = lineOf(Msg::watchRunCrashed, {std::to_string(-told.status)});
-    else if (told.status != 0 && told.failure.empty())
-        told.failure = lineOf(Msg::watchRunSilent, {std::to_string(told.status)});
-    return told;
+    reported.status = ended.status;
+    if (reported.status < 0)
+        reported.failure = lineOf(Msg::watchRunCrashed, {std::to_string(-reported.status)});
+    else if (reported.status != 0 && reported.failure.empty())
+        reported.failure = lineOf(Msg::watchRunSilent, {std::to_string(reported.status)});
+    return reported;
 }
 
 void ToolRun::reach(void (ToolProcess::*call)() const) const {

@@ -42,7 +42,7 @@ const char* whyNever(const FileFacts& facts) {
     }
 }
 
-// What a run says that it has written, as it stands.
+// The files that a run says it has written, with their size and time now.
 std::vector<MadeFile> madeFiles(const std::vector<std::string>& names, const std::string& planned) {
     std::vector<MadeFile> made;
     std::set<std::string> all(names.begin(), names.end());

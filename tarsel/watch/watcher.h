@@ -26,7 +26,7 @@ struct WatchOptions {
     std::string moveTo, failedTo;
     std::string raw;                         // format of inputs that do not describe themselves
     std::vector<std::string> jobOptions;     // of each transcode
-    double settleSeconds = 2;                // for which a file has to stay as it is
+    double settleSeconds = 2;                // for so long a file must not change before it is taken
     std::optional<double> scanSeconds = {};  // between two looks at the whole folder
     bool once = false;                       // what is there, and no more
     bool overwrite = false, quiet = false;

@@ -93,7 +93,7 @@ std::string bash(const ToolText& tool) {
         const bool any = !command.arguments.empty();
         const ArgumentText argument = any ? command.arguments.front() : ArgumentText();
         std::string offer = any ? bashOffer(argument.name, argument.values) : "kind=none";
-        // Of the second one only words can be told from files.
+        // A second argument is completed from its list of words, or from files.
         if (command.arguments.size() > 1 && !command.arguments[1].values.empty())
             offer += " words=" + shellQuoted(joined(command.arguments[1].values, " "));
         cases += bashCommand(command.name, command.options, offer);

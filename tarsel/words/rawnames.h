@@ -9,7 +9,7 @@
 
 struct RawName {
     std::string_view extension;  // without the dot, in small letters
-    unsigned fourcc;             // 0: any format, which is given beside the name
+    unsigned fourcc;             // 0: any format; an option names it
     const char* bytes;           // what a pixel or a group of pixels looks like in the file
 };
 

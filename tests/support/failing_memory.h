@@ -3,7 +3,7 @@
 //
 //     FailingMemory memory(7);                       // the seventh from here on, and no other
 //     FailingMemory none(7, FailingMemory::andAllLater);
-//     ... memory.failed() tells whether it was reached
+//     ... memory.failed(): whether it was reached
 #pragma once
 
 #include <cstdlib>

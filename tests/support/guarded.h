@@ -1,5 +1,5 @@
-// Memory that ends at a page without access, so that one byte too many is a crash, and that shows what
-// was written beside its bytes.
+// Memory that ends at a page without access, so that one byte too many is a crash, and that shows writes in
+// front of and after its bytes.
 #pragma once
 
 #include <sys/mman.h>

@@ -66,7 +66,7 @@ def stopped(box, arguments, number, **streams):
 
 
 def state_line(box):
-    """SIGUSR1 prints a line, and the job goes on."""
+    """SIGUSR1 prints a line, and the job continues."""
     os.mkfifo(box.work / "f.yuv")
     with reader(box.work / "f.yuv", None):
         process = box.start([*LONG, "-o", "f.yuv", "-y"])

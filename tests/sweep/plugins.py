@@ -1,6 +1,6 @@
 """Rogue plug-ins: no libraries at all, cut ones, ones that exit, throw or crash, and ones that others may write.
 
-The run either goes on, with the right bytes, or it ends with an error; in each case the file is named.
+The run either continues, with the right bytes, or it ends with an error; in each case the file is named.
 """
 import os
 import subprocess

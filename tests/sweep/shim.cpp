@@ -3,7 +3,7 @@
 //
 //   SWEEP_RECORD set: nothing fails; each call is reported as a line "KIND SITE STACK"
 //   SWEEP_KIND   alloc, open, read, write, close, rename, sync, thread, make or lock
-//   SWEEP_SITE   who made the call that fails, and
+//   SWEEP_SITE   the place of the call that fails, and
 //   SWEEP_STACK  the hash of its call stack, both as a recording run has reported them
 //   SWEEP_NTH    which call from there, from 1
 //   SWEEP_HOW    eio, enospc, or short (read and write: half of what was asked for, once)

@@ -3,8 +3,8 @@
 
     tests/sweep/sweep.py build/release [--quick | --all] [--kind K]... [--job J] [--case NAME] [--seed N]
 
-Every run has to end as it should: with status 0 and the right bytes, or with an error that is told in one line and the
-old outputs unchanged. A crash, a hang, a torn or mixed result, a success with other bytes, a file left over and a
+Every run has to end as it should: with status 0 and the right bytes, or with an error in one line and the old
+outputs unchanged. A crash, a hang, a torn or mixed result, a success with other bytes, a file left over and a
 message that shows the inside are faults. Each fault is printed with a command that repeats it. The status is 1 if
 there is one. See docs/hacking.md, and the comment of each attack's unit.
 """

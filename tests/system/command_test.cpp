@@ -1,4 +1,4 @@
-// The command line itself: what is wrong is told with what was meant, and data stays apart from talk.
+// The command line itself: an error names what was probably meant, and data stays apart from messages.
 #include <nlohmann/json.hpp>
 
 #include "tests/system/tool.h"

@@ -65,7 +65,7 @@ struct Model {
 
     void addFrames(long long first, long long last) {
         for (long long i = first; i <= last; ++i) levels.push_back(static_cast<int>(20 + i));
-        // The sound of a segment begins with the sample that its first frame begins in, and goes on until all
+        // The sound of a segment begins with the sample that its first frame begins in, and lasts until all
         // frames so far are covered.
         const auto due = static_cast<long long>(levels.size()) * 1001 * 44100 / 30000;
         const long long from = first * 1001 * 44100 / 30000;

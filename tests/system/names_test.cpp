@@ -14,7 +14,7 @@ class Names : public Tool {
     Json list(const char* command) const { return Json::parse(works({command, "--json"}).out); }
 };
 
-// Each name that is listed is written in its format, and read again without being told which.
+// Each name that is listed is written in its format, and read again without an option.
 TEST_F(Names, OfRawFilesSayTheirPixelFormat) {
     const Json names = list("formats")["raw_names"];
     ASSERT_GE(names.size(), 15u);

@@ -201,7 +201,7 @@ TEST_F(OptionTexts, EachOptionIsInTheDocumentAndTheManual) {
     }
 }
 
-// One after the other, as they stand there.
+// One after the other, unchanged.
 TEST_F(OptionTexts, TheExamplesOfTheManualWork) {
     const std::string page = works({"manual"}).out;
     std::string script =

@@ -330,8 +330,8 @@ TEST_F(Output, ALogThatIsFull) {
     }
 }
 
-// Killed while it writes: the next run in the folder removes what is left, and says so unless it is told not
-// to.
+// Killed while it writes: the next run in the folder removes what is left, and says so unless messages are
+// off.
 TEST_F(Output, WhatAKilledRunLeftGoesWithTheNext) {
     const Words endless = words({"transcode", "testgen:size=64x64,rate=25,duration=20000,audio=0", "-o",
                                  "out.raw", "--filter", "rawdump:filename=dump", "--progress", "json"});

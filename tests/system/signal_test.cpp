@@ -79,8 +79,8 @@ TEST_F(Signal, StopsAndLeavesWhatWasThere) {
     EXPECT_EQ(contents("out.raw"), "precious");
 }
 
-// A full standard error, to which the job tells its progress, is what a stop waits for; the end waits for
-// nothing.
+// The standard error is full and nobody reads it: the stop after the first signal waits for it, the second
+// for nothing.
 TEST_F(Signal, TheSecondEndsAtOnce) {
     int full[2];
     ASSERT_EQ(pipe2(full, 0), 0);
@@ -89,7 +89,7 @@ TEST_F(Signal, TheSecondEndsAtOnce) {
     while (write(full[1], page.data(), page.size()) > 0) {
     }
     fcntl(full[1], F_SETFL, 0);
-    // The thread sanitizer would tell of threads that still run, and wait for room to do so.
+    // The thread sanitizer would report threads that still run, and wait for room to do so.
     const std::string line = "export TSAN_OPTIONS=\"$TSAN_OPTIONS report_thread_leaks=0\"; exec '" +
                              program() + "' transcode " + kEndless +
                              " -o out.raw --save-task t.xml --filter rawdump:filename=dump 2>&" +
@@ -244,7 +244,7 @@ TEST_F(Signal, AfterTheResultHasItsNameChangesNothing) {
     while (write(full[1], page.data(), page.size()) > 0) {
     }
     fcntl(full[1], F_SETFL, 0);
-    // The thread sanitizer would tell of threads that still run, and wait for room to do so.
+    // The thread sanitizer would report threads that still run, and wait for room to do so.
     const std::string line =
         "export TSAN_OPTIONS=\"$TSAN_OPTIONS report_thread_leaks=0\"; exec '" + program() +
         "' transcode testgen:size=64x64,duration=0.1,audio=0 -o out.raw 2>&" + std::to_string(full[1]);

@@ -165,7 +165,7 @@ class Band {
         tag = y;
     }
 
-    // Words that could not be made in a target at odd addresses.
+    // Copies a line of words that could not be written directly, as the target has odd addresses.
     void copyToUnaligned(const Stage& stage, int p, int y, const Byte* from) const {
         const Buffer& buffer = stage.gives[count(p)];
         if (buffer.target < 0) return;
@@ -323,7 +323,7 @@ class Band {
         }
     }
 
-    // The line itself, where its weight is all of the sum.
+    // The line of the source that has the whole weight; null if none has.
     const Byte* tapTakenWhole(const Stage& stage, int y) {
         const Axis& axis = stage.down->axis;
         const int start = axis.copies ? y + axis.offset : axis.start[count(y)];
@@ -337,7 +337,7 @@ class Band {
 
     void downSamples(const Stage& stage, int y, Byte* to, int n) {
         const Axis& axis = stage.down->axis;
-        // Else its readers have looked.
+        // Without a target only its readers ask for lines, and they have checked already.
         const bool look = stage.gives[count(stage.plane)].target >= 0;
         if (const Byte* whole = look ? tapTakenWhole(stage, y) : nullptr) {
             std::memcpy(to, whole, count(n) * stage.item);
@@ -395,7 +395,7 @@ class Band {
         kernel(*plan_.rows.toRgb, from[0], from[1], from[2], to, count(stage.pixels), stage.halves);
     }
 
-    // Four lines of pixels, of which fewer taps repeat the last one; and their weights.
+    // Fills in four lines of pixels and returns their weights. With fewer taps the last line is repeated.
     const Byte* fourLines(const Stage& stage, int y, const Byte** lines) {
         const int taps = stage.down->axis.taps;
         window(stage, y, lines);

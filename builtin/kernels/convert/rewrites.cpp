@@ -15,7 +15,8 @@ size_t count(int n) { return static_cast<size_t>(n); }
 
 int sizeOf(const StageList& list) { return static_cast<int>(list.stages.size()); }
 
-// Calls each(index) for the stages of a kind that stand in the list now. True: one of the calls was.
+// Calls each(index) for the stages of a kind that are in the list now, without those it adds. Whether any
+// call returned true.
 template <class Each>
 bool forEach(StageList& list, Work work, const Each& each) {
     bool any = false;
@@ -24,7 +25,7 @@ bool forEach(StageList& list, Work work, const Each& each) {
     return any;
 }
 
-// The stage that a feed reads, if it is of this kind and its lines are read whole.
+// The stage that a feed reads, if it is of this kind and read without an offset; otherwise null.
 Stage* readOf(StageList& list, const Feed& feed, Work work) {
     if (feed.none() || !feed.straight()) return nullptr;
     Stage& stage = list.at(feed.stage);
@@ -73,7 +74,7 @@ bool pixelsShuffled(const Route& route, StageList& list) {
 
 // --- Steps without effect.
 
-// Planes of 8 bits are read where they lie.
+// Planes of 8 bits are read directly from the source.
 bool sourceRead(const Route& route, StageList& list) {
     if (route.deep) return false;
     return forEach(list, Work::raise, [&](int i) {
@@ -83,7 +84,7 @@ bool sourceRead(const Route& route, StageList& list) {
     });
 }
 
-// A plane that keeps its size is not scaled: lines and samples only get other numbers.
+// A plane that keeps its size is not scaled: its readers get offsets instead.
 bool copiesDropped(const Route&, StageList& list) {
     return forEach(list, Work::down, [&](int i) {
         const Stage down = list.at(i);
@@ -99,7 +100,7 @@ bool copiesDropped(const Route&, StageList& list) {
 
 // --- The pass down first, while lines are short.
 
-// The last stage of a plane that is scaled down first; none: it has to be filtered across before.
+// The work that is left for a plane after it was scaled down first; none: it has to be scaled across first.
 std::optional<Work> lastAfterDown(const AcrossPass& pass) {
     const int from = pass.axis.source, to = pass.axis.target;
     if (pass.axis.copies) return Work::downSamples;
@@ -110,8 +111,8 @@ std::optional<Work> lastAfterDown(const AcrossPass& pass) {
     return std::nullopt;
 }
 
-// Where nothing is filtered across, or by two, both passes work on samples, if the weights fit them. Between
-// samples that were rounded there is a second rounding.
+// If a plane is not scaled across, or exactly by two, both passes can work on samples, if the weights fit.
+// The pass across then rounds a second time where it takes means.
 bool downFirst(const Route& route, StageList& list) {
     return forEach(list, Work::down, [&](int i) {
         const Stage down = list.at(i);
@@ -161,8 +162,8 @@ std::vector<Byte> pixelWeights(const Axis& down) {
     return weights;
 }
 
-// The last stage of a plane's scaling, which reads plane `plane` of stage `change` by itself; -1: it is not
-// scaled to half its width.
+// The last stage that scales plane `plane` of stage `change` to half its width and is its only reader; -1:
+// there is none.
 int chromaOfHalves(StageList& list, int change, int plane, bool& filtered) {
     for (int i = 0; i < sizeOf(list); ++i) {
         const Stage& last = list.at(i);
@@ -183,7 +184,7 @@ int chromaOfHalves(StageList& list, int change, int plane, bool& filtered) {
     return -1;
 }
 
-// Pixels of four bytes for the unpacked ones that a change reads.
+// The pixels that a change reads unpacked, as pixels of four bytes.
 Feed pixelsOf(const Route& route, StageList& list, const Stage& unpack, int unpackIndex) {
     const auto& fours = formats()[static_cast<size_t>(formatNumber(qvFourcc("BGR4")))];
     if (unpack.format->packing == Packing::bytes4) return unpack.reads[0];
@@ -332,7 +333,7 @@ bool chromaRepeatedByMatrix(const Route&, StageList& list) {
 
 // --- Less of a line, or none.
 
-// Of what is cut off by a crop no sample is raised.
+// Samples that a crop cuts off are not raised.
 bool raiseTrimmed(const Route&, StageList& list) {
     return forEach(list, Work::raise, [&](int i) {
         for (int p = 0; p < 4; ++p) {
@@ -351,7 +352,7 @@ bool raiseTrimmed(const Route&, StageList& list) {
     });
 }
 
-// Samples that have the form of the target are made in its lines.
+// A stage whose samples already have the target's form writes into the target's lines directly.
 bool madeInTarget(const Route&, StageList& list) {
     bool any = false;
     for (auto& output : list.outputs) {

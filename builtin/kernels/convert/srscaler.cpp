@@ -70,7 +70,7 @@ bool placePlanes(Picture& picture, const Side& original) {
 }
 
 // A span from centre to centre of the outermost source samples, in 1/256, over n target samples: shrunk so
-// that the centre of a target sample lies over the middle of what it stands for.
+// that the centre of a target sample lies over the middle of the source samples that it covers.
 Mapping shrunk(long long first, long long last, int n, unsigned rule) {
     const long long span = last - first;
     const long long t = (std::llabs(span) + n + 256) / (2LL * n);

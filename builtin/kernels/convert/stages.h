@@ -1,13 +1,13 @@
-// A conversion as a list of stages. Each gives lines of up to four planes, and reads lines of other stages.
-// As describe() prints the list of YUYV, 64 pixels wide, to I422 of half the height:
+// A conversion as a list of stages. Each makes lines of up to four planes from lines of other stages. YUYV,
+// 64 pixels wide, to I422 of half the height, as describe() prints it:
 //
 //     0 source
 //     1 unpack 0.0 -> 0: 64 in 16 x 128 bytes -> 1: 32 in 16 x 64 bytes -> 2: 32 in 16 x 64 bytes
 //     2 downSamples 1.0, 8 lines -> 0: 64 in target 0
 //
 // Stage 2 reads plane 0 of stage 1, eight lines for each of its own, and writes into plane 0 of the target.
-// The list of a conversion begins as the plain one that its formats and sizes ask for, and is then rewritten
-// to do less. It is pulled: the target's lines ask for those that they need.
+// The planner makes a plain list from formats and sizes; rewrites then replace its stages by cheaper ones.
+// Work is done on demand: a line of the target makes the lines that it needs.
 #pragma once
 
 #include <array>
@@ -33,7 +33,7 @@ enum class Work : uint8_t {
     change,       // three planes by a matrix, or to other levels
     across,       // one plane scaled across, to exact sums
     down,         // sums scaled down, and rounded
-    downSamples,  // samples scaled down, and rounded; a line that one tap takes whole is not copied
+    downSamples,  // samples scaled down, and rounded; a line of weight 1 is used without a copy
     twice,        // each sample twice
     between,      // one more sample between each two, as their mean
     evens,        // every second sample
@@ -42,7 +42,7 @@ enum class Work : uint8_t {
 
     // What only rewrites put in.
     copy,          // bytes of a line
-    shuffle,       // pixels of three or four bytes to the other
+    shuffle,       // pixels of three bytes to four, or of four to three
     unpackToYuv,   // pixels of four bytes to Y, U, V
     packFromYuv,   // Y, U, V to pixels of three or four bytes
     pixelLuma,     // pixels of four bytes to Y
@@ -95,7 +95,7 @@ struct Stage {
     int pixels = 0;                  // pack, packFromYuv, shuffle: of a line
     int bits = 8;                    // raise, lower: of the other samples
     bool full = false;               // raise, lower: 8-bit samples reach to the end of their range
-    bool halves = false;             // packFromYuv: of chroma there is every second sample;
+    bool halves = false;             // packFromYuv: chroma has half the width;
                                      // pixelChroma: it is filtered across
     std::shared_ptr<const AcrossPass> across;
     std::shared_ptr<const DownPass> down;
@@ -109,10 +109,11 @@ struct Stage {
 
     size_t itemBytes() const;  // of what a width counts
     bool writesBytes() const;  // its lines may begin anywhere
-    bool readsWindow() const;  // more than one line of what it reads
+    bool readsWindow() const;  // reads more than one line for one of its own
 };
 
-// The line y of stage `stage` is the target's line y / down for each y that `down` divides.
+// A stage that makes lines of the target. For target lines y that are multiples of `down` it makes its line y
+// / down.
 struct Output {
     int stage = 0;
     int down = 1, lines = 0, shift = 0;

@@ -13,7 +13,7 @@ Workspace::Workspace(const Plan& plan) {
         longest = std::max(longest, list.sourceWidth);
     }
     tags.resize(static_cast<size_t>(places));
-    const auto around = static_cast<size_t>(longest) + beforeLine + behindLine;
+    const auto around = static_cast<size_t>(longest) + beforeLine + afterLine;
     const auto samples = static_cast<size_t>(neutrals) + wordBlock;
     if (plan.route.deep) {
         paddedWide.grow(around);

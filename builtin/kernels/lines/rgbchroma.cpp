@@ -118,7 +118,8 @@ size_t eachChroma(const ToYuv& rows, const ChromaLines& from, Byte* u, Byte* v, 
                 before = odd;
             }
             const auto su = dot(sum, rowU), sv = dot(sum, rowV);
-            // Blue and green of U beside red of V, and the other way round: added up, U beside V.
+            // One vector pairs U's sum of blue and green with V's share of red, the other V's with U's: their
+            // sum has U and V in turns.
             const auto added = hn::Add(hn::OddEven(sv, su), hn::Shuffle2301(hn::OddEven(su, sv)));
             both[k] = hn::ShiftRight<chromaShift>(hn::Add(added, add));
         }

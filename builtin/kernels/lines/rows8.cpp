@@ -248,7 +248,7 @@ void joinYuyv(Byte* to, const Byte* y, const Byte* u, const Byte* v, size_t n, b
 }
 
 #if QV_VECTORS
-// Vectors of the rows: blue and red side by side, green beside nothing.
+// The weights as vectors, two 16-bit lanes a pixel: blue and red; green and 0.
 struct YuvRow {
     V16 blueRed, green;
     V32 add;

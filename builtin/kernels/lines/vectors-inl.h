@@ -34,7 +34,7 @@ namespace hn = hwy::HWY_NAMESPACE;
 
 // Words at any address, in the order of memory.
 HWY_INLINE uint16_t wordAt(const Byte* from, size_t i) {
-    static_assert(std::endian::native == std::endian::little, "words of memory are read as they stand");
+    static_assert(std::endian::native == std::endian::little, "words are read in the order of memory");
     uint16_t word;
     std::memcpy(&word, from + 2 * i, 2);
     return word;

@@ -204,7 +204,7 @@ std::vector<int8_t> downBytesWeights(const Axis& axis) {
 void padLine(Byte* to, const Byte* from, int n) {
     std::memset(to - beforeLine, from[0], beforeLine);
     std::memcpy(to, from, static_cast<size_t>(n));
-    std::memset(to + n, from[n - 1], behindLine);
+    std::memset(to + n, from[n - 1], afterLine);
 }
 
 }  // namespace srk

@@ -111,7 +111,7 @@ void deepAcross(const Axis& axis, const DeepAcross& across, const uint16_t* from
     float* line = padded + beforeLine;
     std::fill(padded, line, static_cast<float>(from[0]));
     toFloats(line, from, source);
-    std::fill(line + source, line + source + behindLine, static_cast<float>(from[source - 1]));
+    std::fill(line + source, line + source + afterLine, static_cast<float>(from[source - 1]));
     if (across.everyFourth) return everyFourth(across, line, to, target);
     size_t i = 0;
 #if QV_VECTORS

@@ -21,7 +21,7 @@ struct DeepAcross {
 };
 DeepAcross makeDeepAcross(const Axis& axis);
 
-// `from` has axis.source samples, `padded` room for them with beforeLine and behindLine samples around.
+// `from` has axis.source samples, `padded` room for them with beforeLine and afterLine samples around.
 void deepAcross(const Axis& axis, const DeepAcross& across, const uint16_t* from, float* padded, float* to);
 // `taps` lines; rounded to the nearest and clamped.
 void deepDown(const float* const* lines, const float* weights, int taps, uint16_t* to, size_t n);

@@ -39,7 +39,7 @@ Across makeAcross(const Axis& axis);
 
 // Lines that the pass across reads have this many bytes more before and after, which repeat the ends.
 constexpr int beforeLine = maxTaps + 16;
-constexpr int behindLine = maxTaps + 48;
+constexpr int afterLine = maxTaps + 48;
 // Words are written in whole vectors: a line of them has room for this many, and a multiple of it.
 constexpr int wordBlock = 32;
 
@@ -50,13 +50,12 @@ void scaleAcross(const Across& across, const Byte* from, int16_t* to);
 // `taps` lines of words, taps even or 1.
 void scaleDown(const int16_t* const* lines, const int16_t* weights, int taps, Byte* to, int n);
 
-// The pass down alone, on bytes: taps are even; for each two a pair of weights, of tap t and of tap t + taps
-// /
-// 2. Rounded to the nearest.
+// Only the pass down, on bytes. `taps` is even. The weights come in pairs: that of tap t, then that of tap t
+// + taps / 2. Rounded to the nearest.
 void scaleDownBytes(const Byte* const* lines, const int8_t* weights, int taps, Byte* to, int n);
 
-// The weights of each line of an axis as scaleDownBytes takes them. Empty: they do not fit bytes. A weight
-// of 128, the copy of a line, stands as 0 and must not be used.
+// The weights of each line of an axis as scaleDownBytes takes them. Empty: they do not fit bytes. A line that
+// is a copy of one other has the weight 128, which no byte holds: there is a 0, which must not be used.
 std::vector<int8_t> downBytesWeights(const Axis& axis);
 
 const char* scale8Unit();

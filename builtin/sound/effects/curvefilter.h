@@ -19,7 +19,7 @@ class CurveFilter : public SoundFilter {
     // A list with an entry that is no point is refused and changes nothing. An invalid value is an empty
     // list.
     int setParam(const char* name, const Any& value) override;
-    // Beside the lists "paramSet", which describes them.
+    // The lists, and "paramSet", which describes them.
     void getParam(const char* name, Any& value) const override;
     void store(AnyDict& dict) const override;
     int restore(const AnyDict& dict) override;

@@ -30,11 +30,11 @@ class Dynamics : public SoundFilter {
     int init() override;
     // -1 unless initialised.
     int open() override;
-    // Samples that wait stay, and the stages go on from where they are.
+    // Keeps the samples that wait and the state of the stages: a later open continues with both.
     int close() override;
-    // Beside the rows "_streamReport".
+    // The rows and "_streamReport".
     int setParam(const char* name, const Any& value) override;
-    // Beside the rows "paramSet" and "_needsReport".
+    // The rows, "paramSet" and "_needsReport".
     void getParam(const char* name, Any& value) const override;
     void store(AnyDict& dict) const override;
     int restore(const AnyDict& dict) override;

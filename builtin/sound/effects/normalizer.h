@@ -26,9 +26,9 @@ class QvNormalizer : public StoredFilterOf<NormalizerSettings> {
     QvNormalizer();
 
     int open() override;
-    // Beside the rows "_streamReport", a Dict.
+    // The rows and "_streamReport", a Dict.
     int setParam(const char* name, const Any& value) override;
-    // Beside the rows "_needsReport".
+    // The rows and "_needsReport".
     void getParam(const char* name, Any& value) const override;
     void store(AnyDict& dict) const override;
     int write(QvPcm& pcm) override;

@@ -1,13 +1,11 @@
 // Converts the width of samples, to and from the 32-bit values between the stages of a chain.
 //
 //   "outBitsPerSample"   int      24       8, 16, 20, 24 or 32; 20 bits take 3 bytes like 24
-//   "dither"             string   "none"   "none": lower bits are cut off; "triangular": when the output has
-//   8
-//                                          or 16 bits, noise of triangular distribution, two steps wide, is
-//                                          added before rounding. It is the same in every run
+//   "dither"             string   "none"   "none": lower bits are cut off; "triangular": 8 and 16 bits get
+//                                          noise of triangular distribution, two steps wide, before they
+//                                          are rounded. It is the same in every run
 //   "clipWarning"        flag     1        whether clipped values are warned of, once per open
-//   "clippedSamples"     int64    0        read-only: the values that were clipped since the filter was
-//   opened
+//   "clippedSamples"     int64    0        read-only: how many values were clipped since open
 //
 // Sound of the same width is copied. Values out of range take the nearest bound.
 #pragma once

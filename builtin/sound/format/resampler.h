@@ -55,7 +55,7 @@ class Resampler {
     // Values after the end of a view that may be read, but have no effect.
     static constexpr int padding = 16;
 
-    // Rates 1 to maxRate, which differ. Channels stay as they are, become one of two, or two of one.
+    // Rates 1 to maxRate, which differ. Channels are unchanged, become one of two, or two of one.
     Resampler(int inChannels, int outChannels, int inRate, int outRate);
 
     int inChannels() const { return inChannels_; }

@@ -3,10 +3,10 @@
 // Parameter "filename" (text): the file, which open makes anew. Until it is set it reads "set me", and open
 // fails.
 //
-// The file holds the planes of the frames, one after the other, as they stand in memory, with what pads their
-// rows. Frames pass unchanged, also when the file can't be written: then that write or apply returns -1 with
-// a line in the user log, nothing more is written, and close returns -1. Works in place. What is no file,
-// such as a pipe, is written from where it stands, and a stop of the run ends the wait for its reader.
+// The file holds the planes of the frames, one after the other, as in memory, with what pads their rows.
+// Frames pass unchanged, also when the file can't be written: then that write or apply returns -1 with a line
+// in the user log, nothing more is written, and close returns -1. Works in place. What is no file, such as a
+// pipe, is written from its current position, and a stop of the run ends the wait for its reader.
 #pragma once
 
 #include <cstdio>

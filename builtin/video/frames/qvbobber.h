@@ -2,7 +2,7 @@
 // twice the rate. Motion is as smooth as it was shot, and no comb is left.
 //
 // The first frame shows the field that comes first (the bottom field for interlaced 2, else the top field),
-// the second the other one. Rows of the shown field stay as they are. Each missing row lies between two of
+// the second the other one. Rows of the shown field are unchanged. Each missing row lies between two of
 // them, and is made of two guesses:
 //
 //     mean   of the rows above and below: steady where the picture moves, soft where it does not

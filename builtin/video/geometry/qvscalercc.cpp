@@ -230,7 +230,7 @@ int QvScalerCC::scaleInto(const QvFrame& from, unsigned fromFourcc, QvFrame& to,
                                to.width() - 1,
                                to.height() - 1};
     try {
-        // Between formats that it does not know the output stays as it was.
+        // Between formats that it does not know the output is unchanged.
         SRScaler(QvScale::placeTarget | QvScale::cropSource, source.tag, &source, 0, 0, 0, target.tag,
                  const_cast<QvScalePicture*>(&target), 0, 0, 0, 0, flags, rectangles);
     } catch (const std::bad_alloc&) {

@@ -6,16 +6,15 @@
 //     "decoder"             the module that opens it; empty: the one for its extension
 //     "decoderParams" Dict  set on the open decoder, as the format of a raw file; as text, with ";" between:
 //                           FOURCC=BGRA;width=64;height=64
-//     "xpos", "ypos"   0    as of the module "logo": pixels from the left and top, or, negative, from the
-//     right
-//                           and lower edges to those of the frame
+//     "xpos", "ypos"   0    as of the module "logo": pixels from the frame's left and top edges to the
+//                           logo's; negative: from the right and lower edges
 //     "alpha"          1    opacity of all of it, 0 to 1
 //     "scale"          100  percent of the movie's size, 1 to 1000
 //     "loop"           0    1: begins again at its end; 0: its last frame stays
 //
-// The alpha of BGRA, ARGB and b64a movies is straight and counts; all others cover. How the logo is mixed in
-// is as the module "logo" says. A movie that can't be read on stops where it is, with a warning. Works in
-// place, on all formats. open fails without a movie that has a picture.
+// The alpha of BGRA, ARGB and b64a movies is straight and counts; all others cover. It is mixed in as by the
+// module "logo". If the movie can't be read further, its last picture stays, with a warning. Works in place,
+// on all formats. open fails without a movie that has a picture.
 #pragma once
 
 #include <memory>

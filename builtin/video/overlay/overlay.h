@@ -10,7 +10,7 @@ namespace overlay {
 // Text can't be drawn onto v210 and I422.
 bool canDrawOn(const QvFrame& frame);
 
-// Tells the user which of the fonts are no files, and so draw nothing; each file once.
+// Warns of fonts whose files don't exist, and which draw nothing; each file once.
 void warnOfFonts(const QvTextRenderingOptions& options);
 
 // A byte of a colour as a row.

@@ -11,7 +11,7 @@ namespace {
 constexpr uint32_t whole = 65536;
 constexpr int videoFilterInterface = 12;
 constexpr int hdLines = 720;    // from here on a frame of unknown matrix counts as BT.709
-constexpr int chromaReach = 2;  // pixels beside the picture whose chroma has some of it
+constexpr int chromaReach = 2;  // so many pixels next to the picture share chroma with it
 constexpr int leastCanvas = 4;  // what the scaler takes
 constexpr int pixelGroup = 6;   // of v210
 

@@ -3,10 +3,8 @@
 // Parameters:
 //
 //     "filename"  the PNG; its alpha channel, if it has one, is straight
-//     "xpos"   0  pixels from the left of the frame to the picture; negative: from the right edge of the
-//     picture
-//                 to that of the frame
-//     "ypos"   0  pixels from the top, or, negative, from the lower edge
+//     "xpos"   0  pixels from the frame's left edge to the picture's; negative: from the right edges
+//     "ypos"   0  the same from the top edges; negative: from the lower edges
 //     "alpha"  1  opacity of all of it, 0 to 1
 //
 // Where the picture covers the frame by a (its alpha times "alpha"), a sample becomes (1 - a) of itself and a

@@ -1,9 +1,9 @@
 // Burns a subtitle file into the picture (module "subtitle", which is not registered by itself).
 //
 //     name                 type       default  meaning
-//     "subtitle_filename"  path       ""       an "srt" or "sub" file; without one nothing is drawn
+//     "subtitle_filename"  path       ""       an "srt" or "sub" file; "": nothing is drawn
 //     "font_filename"      path       ""       of all three faces; "": the sans fonts of the system
-//     "font_family"        string     ""       goes before "font_filename" if the system has a font of it
+//     "font_family"        string     ""       replaces "font_filename" if the system has such a font
 //     "font_size"          int        32       pixels, 1 to 4096
 //     "speed"              double     1.0      of the subtitles' clock against the picture's, from 0 on
 //     "delay"              double     0.0      ms by which the subtitles come later
@@ -12,10 +12,10 @@
 //     "encodingRange"      list       -        read only: Dicts of "name" and "identifier" to choose from
 //     "framerate"          framerate  -        of the frame numbers in a "sub" file; the picture's if not set
 //     "fontEffect"         int        0        0 to 3
-//     "fontEffectRange"    list       -        read only: likewise, "No effect", "Outline", ...
+//     "fontEffectRange"    list       -        read only: the same for "No effect", "Outline", ...
 //     "pixelAspect"        double     1.0      width to height of the picture's pixels, 0.1 to 10
 //     "normalize"          bool       false    reads the file with QvSubtitles::readFile: for files of any
-//                                              origin, of unknown encoding, with times that are no SubRip's
+//                                              origin, unknown encoding, or times of another form
 //     "wrap"               bool       false    lines wider than the picture, less the margins, become several
 //     "align"              int        0        0: by the size of the letters; 1 to 9: within the margins, as
 //                                              on the keys of numbers, 2 at the bottom; see "align" of
@@ -26,7 +26,7 @@
 //     "format"             int        0        read only: 1 SRT, 2 SUB, 0 while no file is loaded
 //     "paramSet"           list       -        read only: descriptions for a user interface
 //
-// A frame shows what the file has at (frame time in seconds) * speed - delay / 1000.
+// A frame shows the entry of the file at (frame time in seconds) * speed - delay / 1000.
 //
 // open is -9 if the file can't be read or is no subtitle file.
 #pragma once

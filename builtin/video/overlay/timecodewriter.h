@@ -5,9 +5,8 @@
 //     "start"             string         "FirstInputFrame"  that frame counts as 0; "InPoint": frames keep
 //                                                           the numbers that they come with
 //     "startOffset"       int            0                  subtracted from the number
-//     "dropFrame"         int            -1                 1: drop-frame timecode, 0: none, -1: as the
-//     frame's
-//                                                           rate says; 29.97 and 59.94 alone have it
+//     "dropFrame"         int            -1                 1: drop-frame timecode, 0: none, -1: as the rate
+//                                                           says; only 29.97 and 59.94 have it
 //     "font_filename"     path           the sans font      of all three faces
 //     "colorR", "colorG", "colorB"       255                0 to 255
 //     "positionX", "positionY"           -1                 pixels from the top left corner; an x of -1

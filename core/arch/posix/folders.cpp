@@ -41,8 +41,8 @@ int removeEntry(int folder, const std::string& name, Keep keep) {
 }
 
 // Works from open folder to open folder and never by path, so that a folder exchanged for a link while this
-// runs can't lead it elsewhere. Holds one descriptor a level: a tree deeper than the process may open files
-// is left as it is, with -1.
+// runs can't lead it elsewhere. It needs one descriptor a level: a tree with more levels than the process may
+// open files is unchanged, with -1.
 int removeBelow(int parent, const char* name, Keep keep) {
     const int descriptor = openat(parent, name, O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC);
     if (descriptor < 0) return -1;

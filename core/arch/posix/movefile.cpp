@@ -74,8 +74,8 @@ bool copyFile(const char* from, const char* to) {
     return fsync(target.get()) == 0 && target.closeChecked();
 }
 
-// To another disc: under a name of its own beside the target first, so that the target's name never shows
-// half a file, and the source goes only when all is there.
+// To another disc. The copy has a name of its own in the target's folder until it is complete, so the
+// target's name never shows half a file. The source is removed last.
 int moveAcross(const char* from, const char* to, bool replace) {
     const std::string partial = std::string(to) + ".partial-" + std::to_string(getpid());
     if (copyFile(from, partial.c_str()) && renameAs(partial.c_str(), to, replace) == 0)

@@ -26,7 +26,7 @@ enum class Waiting {
     never,       // the file that the shell opened as the standard output
     atRefusal,   // the descriptor is our own and does not block
     perSend,     // a socket: each call asks not to wait
-    beforehand,  // shared with other processes, for which it has to stay as it is
+    beforehand,  // shared with other processes, for which it must not change
 };
 
 // The number in the name of one of this process's descriptors, -1 for other names.

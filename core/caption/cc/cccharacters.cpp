@@ -22,7 +22,7 @@ constexpr Characters32 northCharacters = {"Ã",  "ã", "Í", "Ì", "ì", "Ò", "
                                           "\\", "^", "_", "¦", "~", "Ä", "ä", "Ö", "ö", "ß", "¥",
                                           "¤",  "│", "Å", "å", "Ø", "ø", "┌", "┐", "└", "┘"};
 
-// What stands for them where they are not known.
+// The basic characters that receivers show which don't know the extended ones.
 constexpr std::string_view westFallbacks = "AEOUUu'!''-cs.\"\"AACEEEeIIiOUuU<>";
 constexpr std::string_view northFallbacks = "AaIIiOoOo()/'-/-AaOosY$/AaOo++++";
 

@@ -2,9 +2,8 @@
 //
 //     basic      0x20 to 0x7F, one byte each, two to a pair
 //     special    0x11 0x30 to 0x3F
-//     extended   0x12 or 0x13, 0x20 to 0x3F; takes the place of the basic character before it, which
-//     receivers
-//                that don't know the extended ones show
+//     extended   0x12 or 0x13, 0x20 to 0x3F; replaces the basic character before it, which receivers
+//                show that don't know the extended one
 #pragma once
 
 #include <optional>

@@ -22,7 +22,7 @@ struct QV_API QvCcRow {
 struct QV_API QvCcCue {
     MediaTime start, end;       // the end is the first instant at which it is not shown
     std::vector<QvCcRow> rows;  // from the top
-    bool open = false;          // nothing took it from the screen: the end is a guess
+    bool open = false;          // nothing removes it from the screen: the end is a guess
 
     // The rows, joined by "\n".
     std::string text() const;
@@ -34,19 +34,19 @@ struct QV_API QvCcCue {
 // in the order of the stream; those of one time follow each other, one in each frame of 1001/30000 s, as in
 // the lines of an SCC file. A caption that nothing ends lasts four seconds.
 //
-// Captions that pop on are shown as they are. Of those that roll up or are painted each line makes a cue of
-// what stands on the screen then, so a line that rolls up is in several.
+// A pop-on caption is one cue. Of roll-up and paint-on captions each line makes a cue of what is on the
+// screen then, so a line that rolls up is in several.
 QV_API std::vector<QvCcCue> qvCcCues(std::span<const QvCcBytePair> pairs, int type);
 
 // What qvCcEncode could not do.
 struct QV_API QvCcLosses {
-    std::string characters;  // that captions can't show, each once, as UTF-8; "?" stands for them
-    int late = 0;            // captions that begin late, as their bytes take longer than there is time
+    std::string characters;  // those that captions can't show, each once, as UTF-8; "?" replaces them
+    int late = 0;            // captions that begin late because their bytes do not fit in the time before
     double latest = 0;       // seconds by which the worst does
     int cut = 0;             // captions with more rows than the four that receivers must show
 };
 
-// The captions as byte pairs of field 1, channel 1, which pop on: centred at the bottom, rows of more than 32
-// characters broken in balance. The pairs of one time are a line of an SCC file. Cues need not be sorted; of
-// those that overlap each ends when the next begins. The rows' places are not used, their texts are.
+// The captions as byte pairs of field 1, channel 1, pop-on, centred at the bottom. Rows of more than 32
+// characters are broken into rows of similar length. The pairs of one time are a line of an SCC file. Cues
+// need not be sorted; one that overlaps the next ends when that begins. Of rows only the texts are used.
 QV_API QvCcData qvCcEncode(std::vector<QvCcCue> cues, QvCcLosses& losses);

@@ -1,4 +1,4 @@
-// Captions that pop on: each is loaded unseen, then shown by one code, and taken off the screen by another.
+// Pop-on captions: each is loaded unseen, then shown by one code, and removed from the screen by another.
 //
 //     RCL RCL ENM ENM | address, text of each row ... | EOC EOC          EDM EDM
 //     '--------- before the start, a pair a frame ---' at the start      at the end
@@ -16,7 +16,7 @@ namespace {
 
 constexpr size_t columnCount = 32, mostRows = 4;
 constexpr int resumeLoading = 0x1420, eraseHidden = 0x142E, endOfCaption = 0x142F, eraseScreen = 0x142C;
-const QvRatio frames(30000, 1001);   // each carries a pair, whatever the timecodes count
+const QvRatio frames(30000, 1001);   // a pair in each frame, also if the timecodes are of another rate
 constexpr long long codeFrames = 2;  // a code and its repetition
 
 using Text = std::vector<char32_t>;  // GCC 12 gives false alarms about std::u32string
@@ -54,7 +54,7 @@ std::vector<Text> filled(const std::vector<Text>& words, size_t width) {
     return rows;
 }
 
-// As few rows as can be, of which the longest is as short as can be.
+// As few rows as possible, the longest of them as short as possible.
 std::vector<Text> balanced(const Text& row) {
     const auto words = wordsOf(row);
     size_t narrowest = 1;
@@ -76,7 +76,7 @@ class Encoder {
     void add(const QvCcCue& cue) {
         const long long start = slot(cue.start);
         const Words load = loadOf(cue);
-        // The screen is not cleared for a moment only.
+        // If the next caption follows within the clearing code, it replaces this one without it.
         const bool clears = clearAt_ >= 0 && clearAt_ + codeFrames < start;
         const auto loading = static_cast<long long>(load.size());
         long long begin = start - loading;

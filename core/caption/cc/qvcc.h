@@ -59,15 +59,14 @@ struct QV_API QvSccWriting {
     // A drop-frame rate is written as "HH:MM:SS;FF", which readScc takes with `dropFrameLines`.
     bool dropFrameLines = false;
     // Each word has four digits, and a line of more than 1000 pairs becomes several of the same time, so that
-    // any list reads back whole. Without it a byte below 0x10 has one digit, and its word is no word to a
-    // reader.
+    // any list reads back whole. Without it a byte below 0x10 has one digit, so that readers reject its word.
     bool complete = false;
 };
 
-// A list of byte pairs. The order is that of the stream; times need not be.
+// A list of byte pairs. The order is that of the stream; times need not rise.
 class QV_API QvCcData {
   public:
-    static constexpr int maxBufferPairs = 31;  // what the count of a cc_data structure can say
+    static constexpr int maxBufferPairs = 31;  // the largest count that a cc_data structure can state
     enum BufferFormat { generic = 0, a53 = 3, a72 = 5 };
 
     bool processCCDataFlag() const { return process_; }  // process_cc_data_flag, on at first
@@ -84,7 +83,8 @@ class QV_API QvCcData {
     void remove(int index);  // ignored outside the list
     // Positions before the call; those outside the list are ignored. `sorted`: they rise.
     void remove(const AnyVector& indexes, bool sorted);
-    // Adds the pairs at these positions to `to`, which owns nothing. Valid until the list changes.
+    // Appends pointers to the pairs at these positions to `to`, which owns nothing. They are valid until the
+    // list changes.
     void select(const AnyVector& indexes, TPtrList<QvCcBytePair>& to);
     // Copies of the other's pairs, with their times; null for all. `other` may be this list.
     void extend(const QvCcData& other, const AnyVector* indexes = nullptr);
@@ -97,7 +97,7 @@ class QV_API QvCcData {
     // Of pairs `first` to `last`, inclusive. A `last` of -1 or past the end is the end, a `first` outside the
     // list the start.
     void setTime(const MediaTime& t, int first = 0, int last = -1);
-    // 0 for an empty list. `sorted`: the list is, so one look is enough.
+    // 0 for an empty list. `sorted`: the caller knows that times rise, which saves the search.
     MediaTime minTime(bool sorted = false) const;
     MediaTime maxTime(bool sorted = false) const;
     void shiftTimes(const MediaTime& delta);
@@ -140,14 +140,14 @@ class QV_API QvCcData {
     //   detect          true: `rate` becomes what the highest frame number suggests. False: it is taken as it
     //                   is, with a warning if it seems wrong
     //   dropFrame       null, or what takes the place of the rate's df
-    //   dropFrameLines  for files as they are found: lines with ";" before the frames are read as well, and
-    //   the
-    //                   rate found is then drop frame; carriage returns end lines; a UTF-8 mark may stand at
-    //                   the start; words that are damaged are named in warnings, with their lines
+    //   dropFrameLines  accepts what files in use have: ";" before the frames, which makes the rate that is
+    //                   found drop frame; carriage returns as line ends; a UTF-8 mark at the start; damaged
+    //                   words, which are named in warnings with their lines
     int readScc(const Any& filename, int type, bool detect, QvFramerate& rate, const bool* dropFrame,
                 bool dropFrameLines = false);
-    // The same from where a source is to its end, which it has to reach. `name` is for messages. A source
-    // need not be sought, nor know its size; then QvByteSource::mostUnknown is the most that is read.
+    // The same from the current position of a source to its end; a read that fails before is a failure.
+    // `name` is for messages. The source need not allow seeking. If its size is unknown, more than
+    // QvByteSource::mostUnknown is not read.
     int readScc(QvByteSource& source, const Any& name, int type, bool detect, QvFramerate& rate,
                 const bool* dropFrame, bool dropFrameLines = false);
     // Writes all pairs, whatever their type, a run of equal times as one line. 0; -1 for a file that can't be
@@ -168,7 +168,7 @@ class QV_API QvCcData {
     bool process_ = true;
 };
 
-// A queue of pairs that deals out to each frame exactly what its rate asks for, fillers included:
+// A queue of pairs that gives each frame as many as its rate requires, fillers included:
 //
 //     QvCcProcessor queue;
 //     queue.start(true, false, QvFramerate::f29p(), QvCcProcessor::valid608_1);
@@ -184,9 +184,9 @@ class QV_API QvCcProcessor : public QvCcData {
     void start(bool do608, bool do708, const QvFramerate& rate, int flags);
     void append(const QvCcData& data) { extend(data); }
     using QvCcData::append;
-    // Replaces the pairs of `out` by those of the next frame, at most those queued with a time up to t; what
-    // is due but finds no slot waits. 0. An assertion for rates other than 23.976, 24, 29.97, 30, 59.94 and
-    // 60 frames, and for `out` being the queue itself.
+    // Replaces the pairs of `out` by those of the next frame: queued ones with a time up to t, as many as
+    // there are slots, then fillers. The rest stays queued. 0. An assertion for rates other than 23.976, 24,
+    // 29.97, 30, 59.94 and 60 frames, and for `out` being the queue itself.
     int get(QvCcData& out, const MediaTime& t, int flags = 0);
 
     int frameCounter() const { return frameCounter_; }

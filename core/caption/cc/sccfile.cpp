@@ -83,7 +83,8 @@ std::string_view nextToken(std::string_view& rest) {
     return token;
 }
 
-// "HH:MM:SS:FF", with `dropFrameLines` also with ";". A part is a number as far as it is one.
+// "HH:MM:SS:FF", with `dropFrameLines` also with ";". A part is read up to its first character that is no
+// digit.
 bool readTimecode(std::string_view token, bool dropFrameLines, QvTimecode& timecode) {
     if (token.size() < shortestTimecode || token.size() > longestTimecode) return false;
     char text[longestTimecode + 1] = {};

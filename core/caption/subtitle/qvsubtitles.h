@@ -18,8 +18,8 @@ struct ParsedSubtitle;
 // One entry: lines of text that are shown for a time.
 class QV_API QvSubtitle {
   public:
-    Any text = "";  // lines separated by "|": a String of UTF-8, or of what bytes a file of no stated
-                    // encoding has; UTF-16 and UTF-32 for the renderer as Generic bytes
+    Any text = "";  // lines separated by "|": a String of UTF-8, or of the bytes of a file without stated
+                    // encoding; UTF-16 and UTF-32 for the renderer as Generic bytes
     int rows = 1;   // number of lines
     QvPoint position{-1, -1};  // on the picture, from its top left corner; -1, -1: the default place
     MediaTime start;           // at the default timescale
@@ -27,23 +27,23 @@ class QV_API QvSubtitle {
     AnyVector fieldMasks;  // Int32 for each character: bit 0 leaves out even picture lines, bit 1 odd ones
 };
 
-// What QvSubtitles::readFile found out about a file.
+// What QvSubtitles::readFile reports about a file.
 struct QvSubtitleFindings {
     enum Problem {
         none,
         unreadable,       // or of another extension
         noText,           // binary
-        otherEncoding,    // not in the encoding that was asked for; read all the same, with U+FFFD
-        unknownEncoding,  // not known, and not found out
+        otherEncoding,    // not in the encoding that was asked for; read with U+FFFD for what is invalid
+        unknownEncoding,  // not stated, and not recognised
         noSubtitles,
     };
     Problem problem = none;
     std::string encoding;  // "UTF-8", "UTF-16LE", or a code page's name; with otherEncoding what it may be,
                            // with unknownEncoding what it seems to be, each "" if nothing is known
-    bool guessed = false;  // neither the file nor the caller said so
-    long long line = 0;    // with otherEncoding: the first that is not in it
+    bool guessed = false;  // `encoding` is not from the file nor from the caller
+    long long line = 0;    // with otherEncoding: the first line that is invalid
     int lost = 0;          // entries whose times or frame numbers can't be read
-    bool hasRate = false;  // a MicroDVD file said its rate: rate() has it
+    bool hasRate = false;  // rate() is the rate that a MicroDVD file states
 };
 
 // The subtitles of a file in its order. Pointers to entries are valid until the next parseFile.
@@ -67,21 +67,21 @@ class QV_API QvSubtitles {
     // 0, also for a file without any entry. -1: it can't be read, is no text, or has another extension, or a
     // SUB line is malformed; the entries before that line are kept.
     int parseFile(const Any& filename, const QvFramerate& rate);
-    // The same of a byte source, from where it is to its end, which it has to reach. `name` has the
-    // extension. The source need not be sought, nor know its size; then QvByteSource::mostUnknown is the most
-    // that is read.
+    // The same from the current position of a byte source to its end; a read that fails before is a failure.
+    // `name` has the extension. The source need not allow seeking. If its size is unknown, more than
+    // QvByteSource::mostUnknown is not read.
     int parseSource(QvByteSource& source, const Any& name, const QvFramerate& rate);
-    // For files as people have them: parseFile on a copy of the text, in memory, that has been made UTF-8 and
-    // whose line ends, times, tags, and order are what parseFile expects. `encoding`: of QvText, for a file
-    // without a mark; 0: ASCII or UTF-8, and if it is neither, what its letters are most probably in.
-    // 0, or -1 if the file has no subtitles then.
+    // For files of any origin: parseFile on a copy in memory, which is converted to UTF-8 and to the line
+    // ends, times, tags and order that parseFile expects. `encoding`: of QvText, for a file without a byte
+    // order mark; 0: ASCII or UTF-8, and if it is neither, the most probable one. 0, or -1 if there are no
+    // subtitles in the file.
     int readFile(const Any& filename, const QvFramerate& rate, int encoding, QvSubtitleFindings& findings);
-    // Writes all entries; a SUB file gets frame numbers at rate(). The lines are printed on the standard
-    // output, too. -1 if the file can't be written completely.
+    // Writes all entries; a SUB file gets frame numbers at rate(). The lines are also printed on the standard
+    // output. -1 if the file can't be written completely.
     int saveToFile(const Any& filename, Format format) const;
 
-    // The entry that is shown at `time` (at the default timescale), or null. Asking for rising times costs
-    // next to nothing. Borrowed. Of entries that overlap any one may be found.
+    // The entry that is shown at `time` (at the default timescale), or null. Rising times are found fastest.
+    // Borrowed. Of entries that overlap any one may be found.
     QvSubtitle* find(const MediaTime& time);
     // Keeps each entry on its frame numbers, not on its times.
     void changeFramerate(const QvFramerate& rate);

@@ -20,7 +20,7 @@ struct Decoded {
     long long badLine = 0;  // the first with bytes that the encoding does not have; 0 without one
 };
 
-// Until the first character that stands for bad bytes.
+// The line, from 1, of the first replacement character for invalid bytes; 0 if there is none.
 long long lineOf(std::u32string_view text) {
     const std::size_t bad = text.find(QvUtf::replacement);
     return bad == text.npos

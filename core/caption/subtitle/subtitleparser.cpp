@@ -102,8 +102,8 @@ struct Times {
 
 std::optional<Times> readTimes(View line) {
     constexpr View arrow = "-->";
-    const std::size_t behindSeconds = 8;  // the milliseconds may be short or missing
-    if (const std::size_t at = line.find(arrow, behindSeconds); at != line.npos) {
+    const std::size_t afterSeconds = 8;  // the milliseconds may be short or missing
+    if (const std::size_t at = line.find(arrow, afterSeconds); at != line.npos) {
         View end = from(line, at + arrow.size());
         end.remove_prefix(std::min(end.find_first_not_of(" \t"), end.size()));
         return Times{readTime(line.substr(0, at)), readTime(end), false};

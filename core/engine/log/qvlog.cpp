@@ -168,7 +168,7 @@ void QvDbgLog::logs(int mask, const char* text) {
         if (debugger_)
             qv_platform().debugOutput((std::string(tagOf(mask)) + " " + line.text() + "\n").c_str());
     } catch (const std::bad_alloc&) {
-        // Lines come from clean-ups too, which go on without them.
+        // Clean-ups report too and must continue, so a line without memory is lost.
     }
 }
 

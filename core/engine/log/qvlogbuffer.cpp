@@ -19,8 +19,8 @@ std::recursive_mutex& section() {
 }
 using Lock = std::lock_guard<std::recursive_mutex>;
 
-// The debug log takes the text as a format without arguments: "%%" stands for "%", and as nothing may be read
-// for any other conversion, it stays as it is.
+// The debug log takes the text as a format without arguments: "%%" becomes "%". Any other conversion is kept
+// as text, because there is no argument to read.
 std::string asFormatted(const char* text) {
     std::string out;
     for (const char* c = text; *c; ++c) {
@@ -66,7 +66,7 @@ void QvLogBuffer::logs(int mask, const char* text) {
         messages_.append(message);
         qv_dbg()->logs(mask, asFormatted(text).c_str());
     } catch (const std::bad_alloc&) {
-        // Messages come from clean-ups too, which go on without them.
+        // Clean-ups report too and must continue, so a message without memory is lost.
     }
 }
 

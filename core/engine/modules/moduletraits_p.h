@@ -17,7 +17,7 @@ struct ModuleTraits {
     CodecFamily family = CodecFamily::none;
     // "onlyScales" (Int32): a filter that changes the size and layout of a picture and nothing else.
     bool onlyScales = false;
-    // "convertsFormat" (Int32): a filter of sound that changes its format and leaves the sound as it is.
+    // "convertsFormat" (Int32): a filter of sound that changes its format and leaves the sound unchanged.
     bool convertsFormat = false;
     // "ownStatistics" (Int32): an encoder that takes the name of a file for the statistics of its first pass,
     // and not a record to write them to.

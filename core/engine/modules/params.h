@@ -19,7 +19,7 @@
 //         if (!qvGetParamRow<Settings>(rows, settings_, name, value)) QvVideoFilter::getParam(name, value);
 //     }
 //
-// What a row can't say (side effects, indexed names as "channel3_volume") is written by hand beside it.
+// What a row can't say (side effects, indexed names as "channel3_volume") is written by hand next to it.
 #pragma once
 
 #include <climits>

@@ -22,7 +22,7 @@ struct QvParamRow;
 // contract is a QvAssertFailure.
 class QV_API QvCodec {
   public:
-    // The core compares with these two only; a codec may go on to values of its own.
+    // The core compares with these two only; a codec may use more values of its own.
     enum State : int { stateCreated = 1, stateInitialised = 2 };
 
     // State 1, no error. Joins the instances of `module` (borrowed, may be null).

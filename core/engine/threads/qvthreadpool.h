@@ -10,8 +10,8 @@
 
 class QV_API QvThreadPool {
   public:
-    // `workers` threads beside the callers, at least 0. Fewer if the system has no more: the work is then
-    // done by those there are, if need be by the caller alone.
+    // `workers` threads, at least 0, in addition to the callers' own. Fewer if the system gives no more: the
+    // work is then done by those that started, if none by the caller alone.
     explicit QvThreadPool(int workers);
     ~QvThreadPool();  // no parallelFor may be running
     QvThreadPool(const QvThreadPool&) = delete;

@@ -24,7 +24,7 @@ class QV_API QvTimer {
 
     // Writes `seconds`, rounded to the nearest millisecond, with its zero; numbers ignore the locale:
     //     sm "3661.500"   msm "61:01.500"   hmsm "1:01:01.500"
-    // Another format leaves the buffer as it is. The buffer needs `strtimeSize` characters. Times beyond
+    // Another format leaves the buffer unchanged. The buffer needs `strtimeSize` characters. Times beyond
     // 100,000,000,000 s are written as that much, NaN as 0.
     static void strtime(char* buffer, double seconds, unsigned format);
     static constexpr int strtimeSize = 32;

@@ -19,7 +19,7 @@ struct ModuleRow {
     bool contains(std::string_view name) const;
 };
 
-// The modules of the registry at the time of the construction. One pass over them serves many questions; the
+// The modules of the registry at the time of the construction. One pass over them answers many questions; the
 // registry itself walks through all modules for each.
 class InstalledModules {
   public:

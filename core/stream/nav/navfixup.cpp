@@ -32,11 +32,12 @@ constexpr uint32_t hasVideo = 0x80000000;
 constexpr uint32_t videoBetween = 0x40000000;
 constexpr uint32_t noVobu = 0x3FFFFFFF;
 constexpr uint32_t noVideo = 0xBFFFFFFF;
-constexpr uint32_t videoOnTheWay = 0x7FFFFFFF;  // no VOBU that far, but video after the next nearer entry
+constexpr uint32_t videoOnTheWay =
+    0x7FFFFFFF;  // no VOBU at this time, but video after the VOBU of the nearer entry
 constexpr uint32_t noSubpic = 0x7FFFFFFF;
 
 // Times of the search table in 90 kHz: each half second to 7.5 s, then 10, 30, 60 and 120 s. The last four
-// tell of video on the way.
+// also state whether there is video on the way.
 constexpr int tableEntries = 19;
 constexpr int halfSeconds = 15;
 constexpr std::array<uint32_t, 4> farTimes = {900'000, 2'700'000, 5'400'000, 10'800'000};
@@ -63,7 +64,7 @@ struct CellRange {
     bool contains(int vobu) const { return vobu >= first && vobu <= last; }
 };
 
-// The program's VOBUs with sums that answer questions about ranges at once.
+// The VOBUs of the program, with running sums for questions about ranges.
 class Vobus {
   public:
     explicit Vobus(const NavData& data) : data_(data), time_(1, 0), video_(1, 0) {
@@ -77,7 +78,7 @@ class Vobus {
 
     int count() const { return static_cast<int>(data_.sector.size()); }
     bool video(int i) const { return data_.flags[static_cast<size_t>(i)] & 1; }
-    // 0 after the last, as in an array that was cleared.
+    // 0 after the last VOBU.
     uint32_t sector(int i) const { return i < count() ? data_.sector[static_cast<size_t>(i)] : 0; }
     bool videoIn(int first, int end) const {
         return first < end && video_[static_cast<size_t>(first)] < video_[static_cast<size_t>(end)];
@@ -188,7 +189,7 @@ void SegmentFixup::putPrevious(Pack& pack, int i) const {
 
 void SegmentFixup::putForward(Pack& pack, int i) const {
     const int last = std::min(cell_.last, vobus_.count() - 1);
-    int nearer = 0;  // what the entry before found; VOBU 0 counts as nothing
+    int nearer = 0;  // VOBU of the entry before; 0 if it found none, or VOBU 0
     for (int entry = 0; entry < tableEntries; ++entry) {
         const bool isFar = entry >= halfSeconds;
         const std::optional<int> found = vobus_.reach(i, last, tableTime(entry));

@@ -233,7 +233,7 @@ void JoinedSegments::logStart() const {
         qv_dbg()->info("[BatchDecoder] Starting new segment %d", current);
 }
 
-// The last segment stays as it is, for its last frame is still in use.
+// The last segment stays open, because its last frame is still in use.
 int JoinedSegments::nextSegment() {
     QV_ASSERT_MSG(current >= 0 && current < sizeOf(segments), "[BatchDecoder] _currentSegment out of range");
     logCounts(current);

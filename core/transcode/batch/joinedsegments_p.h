@@ -36,13 +36,13 @@ int sizeOf(const std::vector<T>& list) {
 struct BatchSegment {
     std::vector<std::unique_ptr<SegmentVideo>> videos;  // in the order of the output's
     std::vector<std::unique_ptr<SegmentAudio>> audios;
-    MediaTime length;  // of its shortest picture, without one of its shortest sound; since prepare
+    MediaTime length;  // set by prepare: of its shortest video stream, or without one of its shortest sound
 
     const QvIStream* input(int type, int stream) const;  // null for a stream that it does not have
 };
 
-// Filled first: jobs and segments. Then prepare, makeOutputs, restart of each stream, reads, stop. Failures
-// are a status with a reason in `why`.
+// Order of use: the caller fills in jobs and segments, then calls prepare, makeOutputs, restart for each
+// stream, reads, stop. A failure is a status with a reason in `why`.
 class JoinedSegments {
   public:
     std::vector<BatchSegment> segments;
@@ -51,18 +51,18 @@ class JoinedSegments {
     AnyVector smartStreams;  // numbers of the video streams that are not read
 
     bool isSmart(int video) const { return smartStreams.contains(Any(video)); }
-    // What an encoder needs to take over coded frames of (type, stream); false unless every segment can give
-    // it unconverted.
+    // What an encoder needs to copy coded frames of (type, stream); false unless every segment can give them
+    // unconverted.
     AnyVector storedFiles() const;
     AnyVector storedSources(const Pair& address) const;
     bool smartParams(const Pair& address, AnyDict& out) const;
     int frameTotal(int stream) const;            // at any time
     long long clippedSamples(int stream) const;  // beyond full scale, of those that were read
     long long sampleTotal(int stream) const;     // of the sources' sound
-    // What reads give: where there is a picture, sound lasts as long as it does.
+    // How many samples the reads give: if there is a picture, the sound is as long as the picture.
     long long soundTotal(int stream) const;
 
-    // Builds each conversion once, to see that it can be; again when its segment begins.
+    // Builds each conversion once, so that an impossible one fails here. It is built again for its segment.
     int prepare();
     void makeOutputs();
     // From the first segment on.

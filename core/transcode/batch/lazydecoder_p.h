@@ -12,8 +12,8 @@
 
 class LazyDecoder;
 
-// Which of a task's sources are open. Past the limit one is closed that nobody reads, or else the one that
-// was not read for longest.
+// The open sources of a task. Beyond the limit one that no decoder uses is closed, or if there is none the
+// one that was read least recently.
 class OpenDecoders {
   public:
     // Several decoders are read in turn; `limit` is above their number.
@@ -40,9 +40,9 @@ class OpenDecoders {
     int limit_;
 };
 
-// Answers what is known of the source without opening it. The first read opens the source, with the streams
-// that are selected at the positions that were sought; when it is closed to make room, its positions are kept
-// and the next read begins there. Whatever changes the source, as setParam, opens it for good.
+// Answers from known facts while the source is closed. The first read opens it, selects its streams and seeks
+// to their positions. If it is closed to make room, positions are kept, and the next read continues there.
+// Calls that change the source, such as setParam, open it for good.
 class LazyDecoder : public QvDecodePipe {
   public:
     using Opener = std::function<QvDecodePipe*()>;  // an open decoder for the caller, null when it fails
@@ -104,7 +104,7 @@ class LazyDecoder : public QvDecodePipe {
     QvDecodePipe* awake() const;        // null when the source can't be opened; the error is set
     QvDecodePipe& mustBeAwake() const;  // asserts that it can
     QvDecodePipe& forGood() const;      // the same, and it stays open
-    int refuse() const;                 // what a call gives that found the source gone
+    int refuse() const;                 // the result of a call when the source can't be opened
     void leave();
     int copyError(int result);
 };

@@ -232,7 +232,7 @@ int QvBatchTask::restore(const QvTaskState& state, QvDPipeList& decoders, QvEnco
     for (QvDecodePipe* decoder : made.decoders) all.append(decoder);
     setPostprocessCommand(state.postprocessCommand());
     QvEncodePipe* const pipe = made.keep();
-    decoders = std::move(all);  // who is given both would delete what a failed attempt has deleted
+    decoders = std::move(all);  // only on success: a failed attempt has deleted them
     if (encoderOut) *encoderOut = pipe;
     return QvStatus::ok;
 }

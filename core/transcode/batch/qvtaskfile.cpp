@@ -59,8 +59,8 @@ struct Fault {
     throw Fault{place, QvStatus::invalidStructure, reason};
 }
 
-// Whether nothing but a number of this type is there, within its range. Reading would take as much of the
-// text as is one, or the nearest limit.
+// Whether the whole text is a number of this type, within its range. The reader itself accepts more: it stops
+// at the first wrong character, and clamps to the range.
 template <class Number>
 bool isNumber(Text text) {
     text = qvnumber::begin(text);
@@ -198,7 +198,8 @@ void checkPoints(const Place& source) {
 
 using Names = std::unordered_set<std::string>;
 
-// A segment's file is opened with the defaults of its kind if `files` (null then) does not list it.
+// `files`: the names that the file may have; null for any, as with several segments a file that is not listed
+// is opened with the defaults of its kind.
 void checkSource(const Place& source, int type, const Names* files) {
     const std::string file = text(source, "file");
     if (file.empty()) damaged(source.entry("file"), "the name is empty");
@@ -289,7 +290,8 @@ void checkTask(const Place& root) {
 
 using Modules = std::set<std::pair<int, std::string>>;  // those that are there, by kind
 
-// `named` is a text, or a dictionary, whose name is an attribute or a key. One without a name is not checked.
+// `named` is a text, or a dictionary that has the name as an attribute or a key. Without a name nothing is
+// checked.
 void checkModule(Modules& present, const Place& named, int type, const char* kind) {
     if (!named) return;
     std::string name = isDictionary(named) ? attribute(*named.node, "name") : "";

@@ -4,9 +4,9 @@
 //     if (fault.status != 0)
 //         printf("job.xml, line %d: %s: %s\n", fault.line, fault.path.c_str(), fault.reason.c_str());
 //
-// Nothing here throws. QvTask::restore and fromState take a dictionary that the application vouches for, and
-// assert (QvAssertFailure) what no stored task can hold; a file from elsewhere is checked first, or opened by
-// QvTaskFile::open.
+// Nothing here throws. QvTask::restore and fromState are for dictionaries that the application itself has
+// made: they assert (QvAssertFailure) if it is no valid task. Check files of other origin first, or open them
+// with QvTaskFile::open.
 #pragma once
 
 #include <string>

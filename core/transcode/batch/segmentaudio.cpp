@@ -87,7 +87,8 @@ int SegmentAudio::prepare(const AudioJobDescription& output, const SegmentAudio*
     return result;
 }
 
-// Channels that nothing says how to connect reach the encoder as they are, which refuses them.
+// Whether the channels are passed on unconverted because nothing says how to connect them. The encoder then
+// refuses them.
 bool SegmentAudio::straight() const {
     if (job_.inChannels == job_.outChannels || job_.connMatrix.size() == job_.outChannels) return false;
     qv_dbg()->debug("channel number differ, conn matrix required");

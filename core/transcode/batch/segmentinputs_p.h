@@ -18,7 +18,7 @@ class SegmentInputs {
 
     // Fills in the decoders and streams of a segment. 0, or QvStatus::failed with the reason in `error`: the
     // decoders that were opened by then are in the segment. An index out of range is an assertion. One
-    // decoder serves all streams of a file, unless the same stream is asked for twice.
+    // decoder reads all streams of a file, unless the same stream is asked for twice.
     int open(int index, QvInputSegment& segment, std::string& error);
 
   private:

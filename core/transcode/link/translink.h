@@ -1,9 +1,9 @@
 // What joins one decoder stream to one encoder stream: the points of the job, the conversion that the output
-// needs, and one step of work at a time. The transcoder calls the operations of TransLink alone; what it has
-// to know of frames, samples, chapters and smart rendering is in the links.
+// needs, and one step of work at a time. The transcoder calls only the operations of TransLink; all that
+// depends on frames, samples, chapters and smart rendering is in the links.
 //
-// A link goes: init once, setProcessParams any number of times, then for each run open, processFrame until it
-// has finished, close. One thread at a time. Decoder and encoder pipe are not owned and must outlive it.
+// Order of calls: init once, setProcessParams any number of times, then for each run open, processFrame until
+// finished(), close. One thread at a time. Decoder and encoder pipe are not owned and must outlive it.
 #pragma once
 
 #include <initializer_list>
@@ -39,15 +39,15 @@ class QV_API TransLink {
     // "qualityStats".
     // -1 when open already.
     virtual int open(const AnyDict* params);
-    // Ends the run. A closed link is left alone: 0. Otherwise 0 or what a filter failed with since open, here
-    // or before: filters let frames pass that they could not work on, and no step reports it.
+    // Ends the run. 0, also for a closed link, or the first failure of a filter since open. No step reports
+    // it, because a filter that fails lets its frames pass.
     virtual int close() = 0;
     // One step: a frame for video, exactly n samples for audio. The status of the writer, or of the reader
     // when it failed before the expected end.
     virtual int processFrame(int n) = 0;
     virtual bool finished() const { return finished_; }
-    // Whether the sound of a run ended, by a fault or a lack of data, before what its source announced. There
-    // is silence in the place of the rest, so the count does not show it.
+    // Whether the sound of a run ended before the length that its source announced, by a fault or a lack of
+    // data. The rest is silence, so the count does not show it.
     virtual bool endedEarly() const { return false; }
     virtual int totalOutFrames() const = 0;  // video only
     virtual double samplesPerFrame() const;
@@ -65,7 +65,7 @@ class QV_API TransLink {
     virtual int nrMetaSources() const;
     virtual QvDecodePipe* metaSource(int index) const;
     virtual int metaSourceStreamNr(int index) const;  // -1 out of range
-    // The format of the decoder stream, and the giving of a format to the encoder stream.
+    // Reads the format of the decoder stream; sets the format of the encoder stream.
     virtual void _getInParams(AnyDict& params) const;
     virtual int _setOutParams(const AnyDict& params);
     // The same as open, for callers that have no dictionary.
@@ -84,10 +84,10 @@ class QV_API TransLink {
     MediaTime outPoint() const { return inOutPoints_.outPoint(); }
     int errorCode() const { return errorCode_; }
     const char* errorDesc() const;  // never null
-    // Ends the waits of filters that are a QvCancellable; in force from the next open on. Null: nothing does.
+    // `cancel` ends the waits of filters that are a QvCancellable, from the next open on. Null: nothing does.
     void setCancel(std::shared_ptr<QvCancel> cancel) { cancel_ = std::move(cancel); }
-    // Watches what `open` reads ahead for filters that need a report; false makes it fail. Empty: nothing
-    // does.
+    // Called while `open` reads the sound for filters that need a report; if it returns false, open fails.
+    // May be empty.
     void setReadWatch(QvReadWatch watch) { readWatch_ = std::move(watch); }
     // Makes the encoder stream take the format of the decoder stream. -1 before init.
     int copyFormat();
@@ -100,7 +100,7 @@ class QV_API TransLink {
     void copyError(int code, const Any& text);
     void nameStreams();
     void readLogProgress();
-    // The points of `params`, or 0 to `end`, where also an out point of 0 lies; true if they were given.
+    // Takes the given points, or 0 to `end`; an out point of 0 also means `end`. True if points were given.
     bool takePoints(const LinkOpen& given, const MediaTime& end);
     // The description of encoder and filters that ends the log of a link.
     void logEncoder(const QvCodec& encoder, std::initializer_list<const char*> names) const;

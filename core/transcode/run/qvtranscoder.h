@@ -39,25 +39,24 @@ class QV_API QvTranscoder {
 
     // With a null task the transcoder makes and owns one.
     explicit QvTranscoder(QvTask* task = nullptr);
-    // Copies share nothing but the task pointer: only the class interface needs them.
+    // A copy shares the task pointer and nothing else.
     QvTranscoder(const QvTranscoder& other);
     QvTranscoder& operator=(const QvTranscoder& other);
 
-    // Stops a run that is going on and waits for it. By then the callbacks of a derived class are gone: its
-    // own destructor calls stop() first. Never from a callback.
+    // Stops a run and waits for its end. A derived class calls stop() in its own destructor, because its
+    // callbacks are gone when this one runs. Never from a callback.
     virtual ~QvTranscoder();
 
     // Runs `task` in place of the current one, which comes back when the run is over.
     virtual int transcode(QvTask* task, bool synchronous);
-    // Runs the current task. Synchronous: the result of the run. Asynchronous: 0 once the worker is
-    // started. QvStatus::warning (-16): legal with a warning, and the run went on; QvStatus::notLegal (-11)
-    // and other failures: errorDesc() has the text and nothing was written.
+    // Runs the current task. Synchronous: the result of the run. Asynchronous: 0 once the worker is started.
+    // QvStatus::warning (-16): legal with a warning, and it ran; QvStatus::notLegal (-11) and other failures:
+    // errorDesc() has the text and nothing was written.
     virtual int transcode(bool synchronous);
-    // Ends a run and waits until it has ended; from any thread. From a callback it asks for the end alone.
-    // Always 0.
+    // Ends a run and waits until it has ended; from any thread. In a callback it does not wait. Always 0.
     virtual int stop();
-    // Asks for the end and returns at once; from any thread and any callback. Between two runs it is for the
-    // next one. Like stop() it ends a wait for the reader of an output that is a pipe, a socket or a
+    // Requests the end and returns at once; from any thread and any callback. Between two runs the request is
+    // for the next one. Like stop() it ends a wait for the reader of an output that is a pipe, a socket or a
     // terminal; such a run counts as stopped, and its output is a part.
     void requestStop();
     // Holds and resumes an asynchronous run between two steps; asserts in a synchronous one.
@@ -88,7 +87,7 @@ class QV_API QvTranscoder {
     // the thread that calls transcode(), which fails if a stop is asked for meanwhile.
     virtual void cbMeasure(double part);
 
-    // --- Setting up; all of these assert while a run is going on --------------------------------------
+    // --- Setting up; all of these assert during a run --------------------------------------------------
 
     void setEncoder(QvEncodePipe* pipe);  // not owned
     QvEncodePipe* encoder() const;

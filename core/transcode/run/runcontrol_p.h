@@ -1,4 +1,4 @@
-// What the threads of a transcoder share: whether a run is going on, and the wishes to stop and to pause it.
+// What the threads of a transcoder share: the state of the run, and the requests to stop and to pause it.
 //
 // `stopping` and the state are polled without a lock; the pause and the list of workers have one, and one
 // condition wakes the threads that wait for a pause, a stop or the end of a run.
@@ -25,21 +25,20 @@ class RunControl {
 
     // --- The life of a run
 
-    void prepare();  // asserts that no run is going on, and waits for the end of the worker before
+    void prepare();  // asserts that nothing runs, and waits for the end of the previous worker
     void begin();
     void end(int newState);
     void addWorker(Worker& worker);
     void waitForEnd();  // until no run is going on, and joins the worker
     void joinWorkers();
-    bool running() const {
-        return running_;
-    }  // ends with the run, also where a failed start leaves the state
+    // False after the run, also if a failed start leaves state() at "transcoding".
+    bool running() const { return running_; }
     int runNumber() const { return runNumber_; }
     bool onRunThread() const;  // this thread runs the job, so it can't wait for its end
 
     // --- Stop and pause
 
-    // `next`: between two runs the wish is for the next one.
+    // `next`: between two runs the request is for the next one.
     void askForStop(bool next);
     void stopLoop() { stopRequested_ = true; }
     bool stopping() const { return stopRequested_.load(std::memory_order_relaxed); }
@@ -47,14 +46,14 @@ class RunControl {
     void pause();
     void resume();
     bool paused() const;
-    // Holds this thread while a pause lasts; a stop ends it. `told` gets true before and false after it, and
-    // may ask for the state of the pause.
-    template <class Told>
-    void waitWhilePaused(Told told) {
+    // Holds this thread while a pause lasts; a stop ends it. `report` gets true before and false after it,
+    // and may ask for the state of the pause.
+    template <class Report>
+    void waitWhilePaused(Report report) {
         if (synchronous || !paused()) return;
-        told(true);
+        report(true);
         waitForResume();
-        told(false);
+        report(false);
     }
     // Ends the waits of the output's streams, which share it.
     const std::shared_ptr<QvCancel>& cancel() const { return cancel_; }

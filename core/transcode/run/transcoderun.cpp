@@ -117,8 +117,8 @@ int TranscodeRun::closeOutput(int result) {
     QvDbgLog& log = *qv_dbg();
     if (QvMuxer* muxer = pipe.getMuxer()) {
         log.info("[transcoder] Calling cbMuxClose()");
-        const int told = guarded([&] { return run_.transcoder.cbMuxClose(muxer), QvStatus::ok; });
-        if (result == QvStatus::ok) result = told;
+        const int reported = guarded([&] { return run_.transcoder.cbMuxClose(muxer), QvStatus::ok; });
+        if (result == QvStatus::ok) result = reported;
         log.info("[transcoder] cbMuxClose() returned");
     }
     log.info("[transcoder] closing encoding pipe");
@@ -142,20 +142,20 @@ int TranscodeRun::finish(int result) {
     // A write that a stop has ended is no failure.
     if (run_.control.cancel()->gaveUp()) result = QvStatus::ok;
     run_.statistics.clear();
-    int told = ended ? QvStatus::endOfStream : kStopped;
+    int reported = ended ? QvStatus::endOfStream : kStopped;
     if (result != QvStatus::ok) {
         run_.error.set(QvStatus::failed, "Error in processing");
-        told = result;
+        reported = result;
     }
     Any command;
     const bool complete = result == QvStatus::ok && !stopping();
     if (complete)
-        told = guarded([&] { return command = run_.task.currentPostprocessCommand(), QvStatus::ok; });
+        reported = guarded([&] { return command = run_.task.currentPostprocessCommand(), QvStatus::ok; });
     qv_log()->setLogFile(Any());
     run_.control.end(QvTranscoder::connected);
     // From here on the application may change the task.
-    if (complete && command.isString()) told = guarded([&] { return postprocess(command); });
-    guarded([&] { return run_.transcoder.cbDone(told), QvStatus::ok; });
+    if (complete && command.isString()) reported = guarded([&] { return postprocess(command); });
+    guarded([&] { return run_.transcoder.cbDone(reported), QvStatus::ok; });
     if (isLatest()) returnTask_();
     return result;
 }

@@ -7,6 +7,6 @@
 class QvEncodePipe;
 
 // %i1 %i2 ... and %i: the inputs; %op and %ob: folder and base name of the first output; %o1 %o2 ... and %o:
-// the outputs. The names are quoted for the command line. A command that is no String stays as it is.
+// the outputs. The names are quoted for the command line. A command that is no String is unchanged.
 // `output` may be null.
 Any qvPostprocessCommand(const Any& command, const QvDPipeList& inputs, QvEncodePipe* output);

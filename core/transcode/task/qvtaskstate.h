@@ -1,5 +1,5 @@
-// The description of a transcode as it is kept: a dictionary with typed access. It has no data besides, so it
-// stores and reads as any value does, and a key that is changed is seen at once.
+// The stored description of a transcode: a dictionary with typed access. It has no other data, so it is
+// stored and read like any value, and changes of a key take effect at once.
 //
 //     QvTaskState state(stored);
 //     for (int i = 0; i < state.nrSegments(); ++i) state.setSegmentEnabled(i, wanted(i));
@@ -8,8 +8,8 @@
 // Keys: "__version__", "__class__", "encoder" (a QvEncodePipeState), "filename" (of the output), "files" (a
 // Vector of File), "streams" (a Vector with a Dict for each output stream: "type", and "sources", a Vector
 // with a Source for each segment), "postProcess", "enabled", "segments" (a Vector of 1 and 0), "presetName".
-// "#nsegs" is the number of segments as last counted, -1 when the streams differ: who changes "streams" by
-// hand removes it. "segments" appears when a segment is first enabled, disabled, added, removed or moved.
+// "#nsegs" is the number of segments as last counted, -1 when the streams differ: code that changes "streams"
+// by hand removes it. "segments" appears when a segment is first enabled, disabled, added, removed or moved.
 //
 // A *segment* is one Source for each output stream; several are played one after the other. What is absent,
 // or of another type, reads as an empty value. Wrong indexes and counts are a line in the log and an
@@ -52,8 +52,8 @@ class QV_API QvTaskState : public AnyDict {
         AnyDict decoder() const;
     };
 
-    // The sources of a segment in the order of the output streams, as they were when it was asked for; an
-    // output stream without a source has an empty one. Copies share the sources.
+    // A snapshot of the sources of a segment, in the order of the output streams; an output stream without a
+    // source has an empty one. Copies share the sources.
     class QV_API Segment : public TRefList<const Source> {
       public:
         Segment() = default;
@@ -76,7 +76,7 @@ class QV_API QvTaskState : public AnyDict {
     void setPostprocessCommand(const Any& command) { set("postProcess", command); }
     bool isEnabled() const;  // true when absent
     void setEnabled(bool on);
-    // References live until the state changes; they are to the null sentinel for what is absent.
+    // References are valid until the state changes. What is absent is a reference to the null sentinel.
     const AnyVector& inputFiles() const { return getVector("files"); }
     AnyVector inputFilenames() const;
 
@@ -114,8 +114,8 @@ class QV_API QvTaskState : public AnyDict {
 
     // --- Segments -------------------------------------------------------------------------------
 
-    // 0 when the streams differ in their count. Streams without sources do not count. The first of the two
-    // keeps what it has counted as "#nsegs".
+    // 0 if the streams have different numbers of segments; streams without sources are not looked at. The
+    // non-const operation stores the result as "#nsegs".
     int nrSegments();
     int nrSegments() const;
     AnyVector segments() const;  // 1 or 0 for each
@@ -126,13 +126,13 @@ class QV_API QvTaskState : public AnyDict {
     int getSegment(int index, Segment* segment, std::vector<int>* fileIndices = nullptr) const;
     // The input files that the segment uses, each once, in the order of its sources. As getSegment.
     int getFilesForSegment(int index, AnyVector& files) const;
-    // One source a stream, of the stream's type. `files` (Dicts that are a File) join the input files where
-    // their name is new. In front of `position`, -1 appends. 0, or an assertion that leaves all as it was,
-    // also for a state without sources and without "segments".
+    // Adds a segment in front of `position`; -1 appends. `sources` has one for each stream, of its type.
+    // `files` (Dicts that are a File) whose names are new are added to the input files. 0, or an assertion
+    // that changes nothing, also for a state without sources and without "segments".
     int addSegment(const AnyVector& sources, const AnyVector& files, int position = -1);
     // Replaces a segment. With another file or stream number `files` must not be empty.
     int updateSegment(const AnyVector& sources, const AnyVector& files, int position);
-    // The input files stay as they are, also those that nothing uses any more.
+    // The input files are unchanged, also those that nothing uses any more.
     int removeSegment(int index);
     int swapSegments(int a, int b);  // -1 without streams
 

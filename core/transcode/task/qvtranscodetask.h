@@ -1,5 +1,5 @@
-// A task: what is to be done, apart from the doing. It holds the input decoders, the output (an encode
-// pipe), the links between their streams, the processing parameters, and a command to run afterwards.
+// A task: what is to be done; QvTranscoder does it. It holds the input decoders, the output (an encode pipe),
+// the links between their streams, the processing parameters, and a command to run afterwards.
 //
 //     QvTask task;
 //     task.setEncoder(pipe);
@@ -46,9 +46,10 @@ class QV_API QvTask {
 
     // --- Links ----------------------------------------------------------------------------------
 
-    // Joins one stream of `decoder` (opened and selected here if it is not yet) to one of the output.
-    // The index of the new link; 0 if the same two streams are linked already; negative with a text when
-    // it can't be done. A subpicture stream can't be linked: the result is 0 with a warning in the log.
+    // Joins one stream of `decoder`, which is opened and selected here if necessary, to one of the output.
+    // Returns the index of the new link; 0 if the same two streams are linked already; a negative status,
+    // with a text, if it can't be done. A subpicture stream can't be linked: the result is 0 with a warning
+    // in the log.
     int link(QvDecodePipe* decoder, int type, int decStream, int encStream);
     // The same, and the link takes filters, points, chapters, channel map and quality log of `params`.
     int link(QvDecodePipe* decoder, int type, int decStream, int encStream, const ProcessParams& params);
@@ -96,9 +97,9 @@ class QV_API QvTask {
     int checkLegal(AnyVector& messages);
     // 0, or a failure with a text: nothing linked, a muxer that needs video, too few views.
     int checkStreams();
-    // Lets the links end together, as the streams of one segment do: at the end of the shortest video, or of
-    // the shortest stream where there is no video. Sound that is shorter stays so. The links get points for
-    // it, in place of the task's own. 0.
+    // Makes all links end at one time, like the streams of one segment: at the end of the shortest video, or
+    // without video of the shortest stream. Shorter sound is not extended. The links get points of their own,
+    // which replace those of the task. Returns 0.
     virtual int checkDurations();
     // How many video links can be encoded in two passes; they are appended to `list` unless it is null.
     int checkMultiPass(TPtrList<TransLink>* list) const;
@@ -109,14 +110,14 @@ class QV_API QvTask {
 
     // Writes the task as the dictionary of class "TranscodeTask" that restore reads.
     void store(AnyDict& dict, int options = 0) const;
-    // These three assert (QvAssertFailure) what no stored task can hold, such as another class or a source
-    // that no input file has. They are for states that the application vouches for: a file of any other
-    // origin goes through QvTaskFile (qvtaskfile.h), which reports each fault as a status with its place and
-    // never throws.
+    // These three are for states that the application itself has made. What no valid task holds, such as
+    // another class or a source without an input file, is an assertion (QvAssertFailure). Files of any other
+    // origin are opened with QvTaskFile (qvtaskfile.h), which reports each fault as a status with its place
+    // and never throws.
     //
-    // Makes running objects of a stored task. The opened decoders join `decoders`, the pipe goes to
-    // *encoderOut; both then belong to the caller. After a failure there is no pipe; decoders that were
-    // opened by then are in the list.
+    // Makes the objects of a stored task. The opened decoders are appended to `decoders`, the pipe is put
+    // into *encoderOut; the caller owns both. After a failure there is no pipe, and the list has the decoders
+    // that were opened until then.
     int restore(const AnyDict& state, QvDPipeList& decoders, QvEncodePipe** encoderOut, int options = 0,
                 QvFileOpenCb* callback = nullptr);
     // A new task by restore, or null with all that was made destroyed. `error`, if given, takes the text.

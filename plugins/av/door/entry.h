@@ -7,7 +7,7 @@ namespace av {
 
 inline constexpr const char* codecsFile = "av_codecs.so";
 
-// A new codec of that module, without a module yet, owned by the caller; null for a name that is none.
+// A new codec of that module, without a module yet, owned by the caller; null for an unknown name.
 using CreateCodec = QvCodec* (*)(const char* module);
 inline constexpr const char* createSymbol = "av_create_codec";
 

@@ -90,8 +90,8 @@ std::vector<std::string> namesIn(const std::string& folder) {
     return names;
 }
 
-// A read lease is refused while anyone has the file open for writing. It is given back at once; whoever opens
-// the file in between waits that long, and this process gets a signal that it ignores.
+// A read lease is refused while anyone has the file open for writing. It is given back at once; another
+// process that opens the file in between waits that long, and this one gets a signal that it ignores.
 bool isBeingWritten(const std::string& file) {
     static const bool ignored = std::signal(SIGIO, SIG_IGN) != SIG_ERR;
     const Descriptor open(::open(file.c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC | O_NOFOLLOW));

@@ -31,7 +31,7 @@ fs::path folderOf(const fs::path& name) {
     return name.has_parent_path() ? name.parent_path() : fs::path(".");
 }
 
-// Beside `name`, without a "./" in front.
+// A file in the folder of `name`, without a "./" in front.
 fs::path sibling(const fs::path& name, const std::string& filename) {
     return name.has_parent_path() ? name.parent_path() / filename : fs::path(filename);
 }
@@ -79,10 +79,10 @@ fs::path followed(fs::path name) {
     return name;
 }
 
-// That `name` is not written, as it exists.
+// The failure that says `name` exists and is not written.
 Failure existing(const fs::path& name, const OutputPolicy& policy) {
-    const Failure told = failure(policy.keep ? Msg::outputKept : Msg::outputExists, {name.string()});
-    return policy.keep && policy.quiet ? Failure(Exit::done, "") : told;
+    if (policy.keep && policy.quiet) return Failure(Exit::done, "");
+    return failure(policy.keep ? Msg::outputKept : Msg::outputExists, {name.string()});
 }
 
 // What follows the stem of a name, "#7.png" as "##.png": numbers make no other set.
@@ -97,7 +97,7 @@ std::string shapeOf(std::string_view name) {
     return shape;
 }
 
-// The number in "card#0007.png" after "card#"; -1 for another name, or a number beyond any use.
+// The number in "card#0007.png" after "card#"; -1 for another name or more than 18 digits.
 long long numberIn(const std::string& name, const std::string& start, const std::string& extension) {
     const size_t end = name.size() - std::min(name.size(), extension.size());
     if (name.rfind(start, 0) != 0 || end <= start.size() || name.substr(end) != extension) return -1;
@@ -228,7 +228,7 @@ std::string Outputs::numberedName(const std::string& rest, const std::string& fr
 std::string Outputs::finalName(const fs::path& written, const std::string& from) const {
     const std::string rest = written.filename().string().substr(base_.size());
     if (numbered_ && !rest.empty()) return sibling(output_, numberedName(rest, from)).string();
-    // What was begun without an extension keeps the whole name.
+    // Begun without an extension, the file gets the whole name.
     fs::path name = rest.empty() ? output_.filename() : output_.stem();
     name += rest == "." + from ? output_.extension().string() : rest;
     return (output_.has_parent_path() ? output_.parent_path() / name : name).string();
@@ -242,7 +242,7 @@ bool Outputs::numbers(const std::string& place, const std::string& extension) co
     return numberIn(name, output_.stem().string() + "#", "." + extension) >= 0;
 }
 
-// A link is followed by an output of one file.
+// Only an output of one file follows a link.
 fs::path Outputs::targetOf(const fs::path& name) const { return !set_ && name == output_ ? target_ : name; }
 
 std::string Outputs::placeOf(const fs::path& name) const {
@@ -264,7 +264,7 @@ std::vector<fs::path> Outputs::written() const {
     return files;
 }
 
-// Whether the entry `name` beside the output may be removed as one of its former files.
+// Whether the entry `name` of the output's folder may be removed as one of its former files.
 bool Outputs::mayGo(const std::string& name) const {
     std::error_code error;
     const fs::path path = sibling(output_, name);
@@ -333,7 +333,7 @@ std::vector<std::string> Outputs::formerSet(const std::vector<Manifest::Row>& fr
             names.insert(name);
         hadPictures = hadPictures || isPicture(shape);
     }
-    // Sound alone may be anything.
+    // Sound without pictures may be another file of the user's.
     if (hadPictures) names.insert(sound.begin(), sound.end());
     return {names.begin(), names.end()};
 }

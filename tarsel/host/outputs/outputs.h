@@ -1,6 +1,6 @@
 // Where results go. A job writes into a hidden work folder next to its output; the files get their final
-// names only when all of them are complete and on the disk. After a failure or a signal the folder is removed
-// with all that it holds; what a run that was ended left is put in order by the next one in that folder.
+// names only when all of them are complete and on the disk. After a failure or a signal the work folder is
+// removed with all that it holds. If a run was killed, the next one in that folder cleans up.
 #pragma once
 
 #include <filesystem>
@@ -27,23 +27,23 @@ struct OutputPolicy {
 
     OutputPolicy(bool overwriting) : overwrite(overwriting) {}
     bool overwrite;
-    bool keep = false;         // what exists is left, and the run ends with Exit::done
+    bool keep = false;         // existing files are kept, and the run ends with Exit::done
     bool sync = true;          // bring results to the disk before what they replace is removed
-    bool recover = true;       // put in order what ended runs have left in the folder
-    bool quiet = false;        // say nothing of that
-    long long stale = kStale;  // seconds after which a work folder of another host was left
-    // Hears of all files of a job before the first one gets its name; what it throws leaves them without.
+    bool recover = true;       // clean up what killed runs have left in the folder
+    bool quiet = false;        // don't report that
+    long long stale = kStale;  // seconds after which another host's work folder counts as left over
+    // Gets all files of a job before the first one gets its name. If it throws, none does.
     std::function<void(const std::vector<PlacedFile>& files)> placing = {};
 };
 
-// What is written under one name of the user's: a file, or a set of files that have names made from it. An
-// output that is no file is a StreamOutput.
+// The files that are written for one name given by the user: that file, or a set of files with names made
+// from it. An output that is no file is a StreamOutput.
 class Outputs {
   public:
     // `output`: a name given by the user, with the option `option`. `inputs`: files that must not be
-    // overwritten. `with`: that of the other outputs of the job; null for one of its own. Checks the folder,
-    // puts it in order if `policy` says so, and checks that `output` is no input and, unless overwriting,
-    // does not exist. Throws Failure.
+    // overwritten. `with`: the transaction of the job's other outputs; null for a new one. Checks the folder,
+    // cleans it up if `policy` says so, and checks that `output` is no input and, unless overwriting, does
+    // not exist. Throws Failure.
     Outputs(const std::string& output, const std::string& option, const std::vector<std::string>& inputs,
             const OutputPolicy& policy, std::shared_ptr<Transaction> with = nullptr);
     Outputs(const Outputs&) = delete;
@@ -53,45 +53,47 @@ class Outputs {
     void addInputs(const std::vector<std::string>& files);
     // Refuses a final name that exists (unless overwriting) or is an input.
     void checkFinal(const std::filesystem::path& name) const;
-    // That the files are named after numbers ("pic_%04d.png"); what is numbered counts from 0. `name` is that
-    // of `output`. Before all that follows.
+    // Names the files by numbers ("pic_%04d.png") that count from 0. `name` is the parsed form of `output`.
+    // To be called before the operations below.
     void number(const NumberedName& name);
     // Refuses existing files of the same numbered name, "card#0007.png" for "card.png". An input stays, so it
     // is refused only if one of `count` files, which are numbered from 0, may get its name.
     void checkNumbered(const std::string& extension, long long count) const;
     // Whether `place` (see placeOf) is one of the numbered names of this output.
     bool numbers(const std::string& place, const std::string& extension) const;
-    // That the job writes other files than `output`, or more. Of one file a symbolic link is followed; in a
-    // set each name gets a file, and what a link led to is unchanged. Before begin.
+    // Says that the job writes several files, or one that is not named `output`. Only a single file follows a
+    // symbolic link; in a set each link is replaced by a file, and the file that it led to is unchanged. To
+    // be called before begin.
     void expectSet() { set_ = true; }
 
-    // What the multiplexer would be given, for asking it for its names; the folder is not there yet.
+    // The name that begin would return, with which the multiplexer can be asked for its file names. The
+    // folder does not exist yet.
     std::string hiddenName(const std::string& extension) const;
-    // Makes the hidden folder; the name in it that the multiplexer is to write to, with this extension, or
-    // with none.
+    // Makes the hidden folder. Returns the name in it that the multiplexer is to write to, with this
+    // extension, or without one if it is "".
     std::string begin(const std::string& extension);
     // What was written so far, sorted.
     std::vector<std::filesystem::path> written() const;
-    // Gives every written file its final name; one of the extension that begin was given takes that of
-    // `output`. When overwriting, the files that an earlier run of the same output has left go. Either all is
-    // done or, with a Failure, nothing, and then what stood there before stands there again.
+    // Gives every written file its final name; the extension that begin got becomes that of `output`. When
+    // overwriting, files of an earlier run of the same output are removed. After a Failure nothing is
+    // changed: the former files are there again.
     void commit();
     // The same for all outputs of a transaction at once.
     static void commit(std::span<Outputs* const> all);
     // After commit: the final names, `output` first.
     const std::vector<std::string>& names() const { return names_; }
 
-    // Those of the transaction, for all its outputs.
+    // Operations of the transaction, for all its outputs.
     bool placed() const { return transaction_->placed(); }
     void discard() { transaction_->discard(); }
     bool leave() { return transaction_->leave(); }
 
-    // A message of the engine with the final names in it in place of those in the hidden folder.
+    // A message of the engine in which names in the hidden folder are replaced by the final names.
     std::string withFinalNames(std::string text) const;
     const std::filesystem::path& output() const { return output_; }
     // The final name of a file in the hidden folder, or of what would be written there.
     std::string finalName(const std::filesystem::path& written, const std::string& from) const;
-    // The place that `name`, a final one, stands for, in a form by which places can be compared.
+    // The absolute path that the final name `name` leads to, in a form that can be compared.
     std::string placeOf(const std::filesystem::path& name) const;
 
   private:
@@ -106,7 +108,7 @@ class Outputs {
     [[noreturn]] void notPlaced(const PlaceResult& result, const std::string& folder) const;
 
     std::filesystem::path output_;
-    std::filesystem::path target_;  // where a link leads to that `output_` is; otherwise `output_`
+    std::filesystem::path target_;  // where `output_` leads if it is a link; otherwise `output_`
     std::optional<NumberedName> numbered_;
     std::vector<std::string> inputs_;
     OutputPolicy policy_;

@@ -30,8 +30,8 @@ bool toNumber(std::string_view text, long long& number) {
 // for its parent.
 std::optional<long long> startOf(long long pid) {
     const std::string stat = systemFile("/proc/" + std::to_string(pid) + "/stat");
-    // The name of the program stands in brackets and may hold anything. Behind it come the state, which is
-    // field 3, and at last field 22.
+    // The name of the program is in brackets and may hold anything. After it comes the state, field 3; the
+    // start is field 22.
     size_t at = stat.rfind(") ");
     if (at == std::string::npos) return std::nullopt;
     at += 2;

@@ -35,8 +35,8 @@ struct Leftover {
     bool remains() const { return outcome > Outcome::restored; }
 };
 
-// Looks at all work folders in `place` and does what can be done. Safe beside other runs and calls, and may
-// itself be ended at any point. Nothing for a place that can't be listed.
+// Looks at all work folders in `place` and does what can be done. Safe while other runs and calls are active,
+// and may itself be ended at any point. Nothing for a place that can't be listed.
 std::vector<Leftover> recoverPlace(const std::string& place, const RecoveryRules& rules);
 
 // One line for each thing that a user should know, without "tarsel: ". `brief`: what a job says, for which

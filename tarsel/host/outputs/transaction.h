@@ -57,7 +57,7 @@ class Transaction {
     // The same for a process that is about to end: another thread that uses the transaction afterwards waits
     // for that end, so that it reports nothing that is missing. Whether all files had their names.
     bool leave();
-    // The same for all transactions, by a program that can't go on: takes no lock and no memory. What is
+    // The same for all transactions, by a program that can't continue: takes no lock and no memory. What is
     // being moved is left to the next run. False when there was nothing.
     static bool abandonAll();
 

@@ -36,7 +36,7 @@ class WorkFolder {
     // an end in between leaves a folder of which the rest can be removed. Takes no memory. Nothing without
     // one.
     Removed remove();
-    // Unlocks it and leaves it as it is.
+    // Unlocks it and leaves it unchanged.
     void leave();
 
     explicit operator bool() const { return static_cast<bool>(folder_); }

@@ -35,10 +35,10 @@ struct PlannedStream {
     std::vector<std::string> chain;  // a line for each filter, to be shown
 
     long long expected = 0;  // frames or samples of the output
-    bool hold = false;       // video: the last frame is repeated up to the end of the part
-    MediaTime skipped;       // audio: of the input, for a filter that lets the sound come earlier
-    MediaTime delayed;       // audio: so much later it comes and ends
-    long long own = 0;       // audio: samples of the output that the part itself has
+    bool hold = false;       // video: the last frame is repeated to the end of the part
+    MediaTime skipped;       // audio: left out at the start, for a filter that makes the sound earlier
+    MediaTime delayed;       // audio: silence in front, which makes start and end later
+    long long own = 0;       // audio: samples of the output that come from the part
 
     bool isVideo() const { return type == qvVideoStream; }
     std::string encoder() const { return module.empty() ? isVideo() ? "rawvenc" : "rawaenc" : module; }
@@ -51,12 +51,12 @@ struct PlannedStream {
 
 struct JobPlan {
     OutputForm output;
-    std::shared_ptr<const OutputPreset> preset;  // that the output is made by; null for none
+    std::shared_ptr<const OutputPreset> preset;  // by which the output is made; null for none
     std::vector<JobInput> inputs;
     std::vector<PlannedStream> streams;
     FilterFiles filterFiles;
     std::vector<std::string> warnings;
-    std::vector<std::string> notes;  // what is said without being a warning
+    std::vector<std::string> notes;  // lines for the user that are no warnings
 
     int count(int type) const;  // of streams
     bool hasVideo() const;
@@ -66,21 +66,21 @@ struct JobPlan {
     long long bytes() const;  // that are written, without headers
 };
 
-// The formats that the streams of an output have already, by their numbers.
+// The formats that the streams of an output already have; the index is the number of the stream.
 struct KnownFormats {
     std::vector<PictureFormat> pictures;
     std::vector<SoundFormat> sounds;
 };
 
 // Throws Failure for what can't be done. The engine has to be started, for its filters. With `known` it plans
-// one of several segments, whose streams get these formats as far as they go; it may lack picture or sound,
-// and checkOutput is called for the whole.
+// one of several segments: its streams get these formats, those beyond them their own. A segment may lack
+// picture or sound, so checkOutput is then called for all together.
 JobPlan planJob(const PlanOptions& options, const OutputForm& output, std::vector<JobInput> inputs,
                 const KnownFormats* known = nullptr);
 // Whether the output can hold the streams of the plan; sets its kind where they decide it. Throws Failure.
 void checkOutput(JobPlan& plan, const PlanOptions& options);
 
-// Throws Failure for a damaged input, unless what is there of it is to be taken: then it is a warning.
+// Throws Failure for a damaged input; with `acceptPartial` that is a warning.
 void checkDamage(JobPlan& plan, bool acceptPartial);
 
 // What --dry-run prints: a line for each input, stream, filter, encoder and length, and one for the output.

@@ -16,7 +16,7 @@ struct KindRow {
     OutputKind kind;
 };
 
-// Beside the names of raw files.
+// In addition to the names of raw files.
 constexpr KindRow kKinds[] = {
     {"wav", OutputKind::wav},
     {"png", OutputKind::pictures},

@@ -36,7 +36,7 @@ class Points {
         return picture != plan.streams.end() ? *picture : plan.streams.front();
     }
 
-    // Frames beside a sound of its own file are those of the picture.
+    // Where the sound has a file of its own, "frames" are those of the picture.
     std::optional<QvFramerate> rateFor(const JobInput& input) const {
         const auto own = input.frameRate();
         return own || !leading_.isVideo() ? own : plan_.input(leading_).frameRate();

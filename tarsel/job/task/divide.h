@@ -16,5 +16,5 @@ struct SegmentPlace {
     bool ofCuts = false;  // see Join
 };
 
-// Lets texts and timecodes go on from segment to segment. In cuts, those of the input stay with it.
+// Makes texts and timecodes continue from segment to segment. In cuts, those of the input stay with it.
 void moveTexts(FiltersState& filters, const SegmentPlace& place);

@@ -97,7 +97,7 @@ class StateBuilder {
         return video == streams_.end() ? 0 : blackFrames(lengthOf(segment.plan), video->picture.rate);
     }
 
-    // None of the sound beside it is lost.
+    // Rounded up, so that none of the sound that goes with it is lost.
     static long long blackFrames(const MediaTime& length, const QvFramerate& rate) {
         const long long whole = length.position(rate);
         return std::max(1LL, qvInstantOf(whole, rate.rate()) < length ? whole + 1 : whole);

@@ -40,8 +40,8 @@ class StoredTask {
 
     // Before open: the task does its work and writes nothing.
     void discardOutput();
-    // Opens the inputs and makes the output, which opens nothing yet. The task has no command for afterwards
-    // then: who wants it runs postProcess(). Throws Failure.
+    // Opens the inputs and makes the output, which opens nothing yet. The command for afterwards is taken out
+    // of the task: postProcess() runs it. Throws Failure.
     void open();
     // After open. The sources are the decoders of the task's links, each once.
     QvTask& task() const { return *task_; }

@@ -132,7 +132,7 @@ struct RawAvi : OutputPipe {
 };
 
 // Letters in the order of memory, small ones, great ones and digits in the three planes: rows of BGR from the
-// bottom, filled up with zeros; what an odd size lacks repeats what is beside it.
+// bottom, filled up with zeros; what an odd size lacks repeats its neighbour.
 TEST_F(RawAvi, PicturesOfEachType) {
     const struct {
         unsigned type;

@@ -37,7 +37,7 @@ TEST_F(EncodePipeTest, ParametersFindTheirMember) {
     }
     for (const char* wrong : {"video1/width", "video0/nonsense", "muxer/nonsense", "sink/nonsense", "video0"})
         EXPECT_THROW(pipe().setParam(wrong, 1), QvParamException) << wrong;
-    EXPECT_EQ(pipe().setParam("height", 480), 0) << "to whoever knows it";
+    EXPECT_EQ(pipe().setParam("height", 480), 0) << "to all members that know it";
     EXPECT_EQ(get("video0/height"), Any(480));
     outputs_.params = AnyDict("rawmux.videoNecessary", 1);
     EXPECT_EQ(get("videoNecessary"),

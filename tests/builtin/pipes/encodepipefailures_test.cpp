@@ -41,7 +41,7 @@ struct PipeFailure : testing::Test {
         EXPECT_EQ(std::filesystem::file_size(folder_.file("out.raw")), 3u * 1536);
         EXPECT_EQ(std::filesystem::file_size(folder_.file("out.wav")), 80u + 3 * 480 * 4);
     }
-    // Opens, writes and ends with `call` failing, and looks at what is told and whether all members end.
+    // Opens, writes and ends with `call` failing, and looks at what is reported and whether all members end.
     void run(const std::string& call) {
         const bool byStatus = outputs_.how == FailingOutputs::status;
         const bool atOpen = call.ends_with(".open"), atWrite = call.ends_with(".write");

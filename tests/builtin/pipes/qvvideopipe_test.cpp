@@ -61,7 +61,7 @@ TEST(VideoPipe, GroupsInPlaceFiltersWithTheirHead) {
     for (const auto& row : rows) {
         LogCapture log;
         Pipe pipe(row.filters, row.safe);
-        for (int i = 0; i < 2; ++i) EXPECT_EQ(pipe.open(), 0);  // an open pipe stays as it is
+        for (int i = 0; i < 2; ++i) EXPECT_EQ(pipe.open(), 0);  // an open pipe is unchanged
         EXPECT_EQ(log.texts().back(), row.line);
     }
 }

@@ -8,7 +8,7 @@
 
 namespace {
 
-// A consumer on another thread sees every unit whole and in order while encoding goes on.
+// A consumer on another thread sees every unit whole and in order during encoding.
 TEST_F(OutputPipe, PollingConsumerGetsEveryUnit) {
     ASSERT_EQ(pipe_->setMuxer("memmux"), 0);
     constexpr int count = 200;

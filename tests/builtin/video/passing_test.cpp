@@ -28,7 +28,7 @@ TEST(DumpRaw, AFullDiscIsToldOnceAndFramesPass) {
     const LogCapture log;
     EXPECT_EQ(dump.write(frame), QvStatus::failed);
     EXPECT_EQ(dump.ready(), 1) << "the frame passes";
-    EXPECT_EQ(dump.apply(frame), 0) << "it was told once";
+    EXPECT_EQ(dump.apply(frame), 0) << "it was reported once";
     EXPECT_EQ(log.count("fail to write to " + name), 2) << "in both logs";
     EXPECT_EQ(dump.close(), QvStatus::failed);
     EXPECT_EQ(dump.open() | dump.close(), 0);

@@ -90,7 +90,7 @@ TEST_F(StreamOutputs, ARequestEndsAWriteThatNobodyReads) {
 
     ASSERT_EQ(pipe2(ends, O_CLOEXEC), 0);
     writesUntilTheRequest(open(own(ends[1])), ends[0]);
-    EXPECT_FALSE(fcntl(ends[1], F_GETFL) & O_NONBLOCK) << "whoever shares the pipe would see it";
+    EXPECT_FALSE(fcntl(ends[1], F_GETFL) & O_NONBLOCK) << "others that share the pipe would see it";
     close(ends[0]), close(ends[1]);
 
     ASSERT_EQ(socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0, ends), 0);

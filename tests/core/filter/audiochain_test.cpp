@@ -121,7 +121,7 @@ TEST_F(AudioChain, TheReportGoesToWhoNeedsIt) {
     };
     apply(0);
     EXPECT_TRUE(decoder.requests.empty()) << "nobody needs it";
-    // One that claims it and does not take it is told of, and the others are served.
+    // A filter that claims it and does not take it is reported, and the others get it.
     const LogCapture log;
     for (const int i : {0, 1}) known(i).set("_needsReport", 1);
     known(1).set("_streamReport", Any());

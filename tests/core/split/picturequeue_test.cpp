@@ -65,7 +65,7 @@ TEST_F(PictureQueueTest, FilesComeInTheirOrderOnAnyNumberOfThreads) {
         ASSERT_TRUE(queue.finish());
         EXPECT_EQ(platform.names, wanted);
         for (int i = 0; i < 60; ++i) ASSERT_TRUE(shows(i)) << i << " of " << workers;
-        ASSERT_TRUE(put(queue, 60)) << "it goes on after an end";
+        ASSERT_TRUE(put(queue, 60)) << "it works again after an end";
         ASSERT_TRUE(queue.finish());
         EXPECT_TRUE(shows(60));
         std::filesystem::remove(name(60));

@@ -17,7 +17,7 @@ struct StreamDefaults {
 class ActivePreset {
   public:
     const QvPreset& preset() const { return preset_; }
-    // The lists of allowed modules stay as they are until follow().
+    // The lists of allowed modules are unchanged until follow().
     void set(const QvPreset& preset) { preset_ = preset; }
     // Takes another preset of the same profile: the built-in one, or a user's as a dictionary. A profile that
     // is unknown, none, or another one is an assertion.

@@ -206,7 +206,7 @@ TEST_F(MvMetaDec, WhatDoesNotGoTogetherIsRefusedWithBothValues) {
     setup.views[1].state.clear();
     EXPECT_THAT(faultOf(), HasSubstr("Failed to open file"));
     EXPECT_EQ(MVMetaDec().setParam("layout", "diagonal"), QvStatus::invalidParam);
-    // A disc that loses the end of a file under way: the views never go on out of step.
+    // A disc that loses the end of a file under way: the views never continue out of step.
     setup.views = {view("l.yuv", 20000, 1), view("t.yuv", 20000, 2)};
     const auto decoder = open();
     ASSERT_EQ(fault, "");

@@ -16,7 +16,7 @@
 
 namespace {
 
-// All formats by names that a caller uses; one depth of each W family, and others beside.
+// All formats by names that a caller uses; one depth of each W family, and others besides.
 std::vector<std::string> formatNames() {
     std::vector<std::string> names;
     for (const auto& format : srk::formats()) {

@@ -33,7 +33,7 @@ const Geometry geometries[] = {
 };
 
 std::vector<int16_t> across(const Across& table, Guarded& line, int64_t target) {
-    std::vector<Byte> padded(static_cast<size_t>(beforeLine + table.source + behindLine));
+    std::vector<Byte> padded(static_cast<size_t>(beforeLine + table.source + afterLine));
     padLine(padded.data() + beforeLine, line.data(), table.source);
     std::vector<int16_t> words(static_cast<size_t>(table.target + wordBlock), 77);
     const OnTarget only(target);
@@ -135,7 +135,7 @@ TEST(Deep, LinesAreScaledAcrossAlikeAndNearTheExactSum) {
             for (size_t i = 0; i < source; ++i) line[i] = static_cast<uint16_t>(i * i * 2654435761u >> 7);
             std::vector<float> expected;
             for (const auto unit : machineTargets()) {
-                std::vector<float> padded(source + beforeLine + behindLine), to(target + 1, 7);
+                std::vector<float> padded(source + beforeLine + afterLine), to(target + 1, 7);
                 const OnTarget only(unit);
                 deepAcross(axis, across, line.data(), padded.data(), to.data());
                 EXPECT_EQ(to[target], 7);

@@ -30,7 +30,7 @@ TEST(CVideoFade, RampsAreLinearAndMeetBlackAtTheEnds) {
         {0, 2, 4, 0, {235, 235, 126, 16, 16, 16}},  // past the count
         {2, 2, 3, 0, {16, 71, 16}},                 // overlapping
         {0, 2, 0, 4, {235, 235, 126, 16}},          // counted by the job
-        {0, 2, 3, 9, {235, 126, 16}},               // told otherwise
+        {0, 2, 3, 9, {235, 126, 16}},               // set otherwise
         {0, 9, 0, 0, {235, 235, 235}},              // nobody knows
         {1, 1, 1, 0, {16}},
     };

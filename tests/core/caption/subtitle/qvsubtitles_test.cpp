@@ -109,7 +109,7 @@ TEST_F(Subtitles, EncodingsAreToldByMarksAndBytes) {
         EXPECT_STREQ(subtitles.encodingName(), c.name);
         EXPECT_EQ(entries(), "1000-2000 " + c.expected + "\n") << c.name;
     }
-    // What grows beyond its file is cut and told.
+    // What grows beyond its file is cut, with a report.
     const std::u16string line = u"{1}{2}" + std::u16string(30, u'\u732B') + u"\n";
     EXPECT_EQ(parse("a.sub", "\xFF\xFE" + utf16(line + line, false)), 0);
     EXPECT_EQ(subtitles.unread(), 2 * (7 + 90) - (2 * 2 * 37 - 2));

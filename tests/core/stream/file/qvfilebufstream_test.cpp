@@ -164,7 +164,7 @@ TEST_F(FileStream, AFullDiscReachesTheWriterAndWhoeverCloses) {
     EXPECT_TRUE(!in->request(in, 1) && copyIn(in, "x") == 0);
     EXPECT_EQ(stream.ioError(), ENOSPC);
     EXPECT_NE(stream.ioErrorText().find("full.bin"), std::string::npos) << stream.ioErrorText();
-    EXPECT_EQ(qv_log()->nrErrors(), 1) << "told once";
+    EXPECT_EQ(qv_log()->nrErrors(), 1) << "reported once";
     EXPECT_EQ(in->split(in), BUFSTREAM_FAILED);
     stream.destroy(0);
     EXPECT_EQ(stream.ioError(), ENOSPC);

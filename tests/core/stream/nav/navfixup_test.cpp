@@ -138,7 +138,7 @@ TEST(NavigationTables, SearchTablesToTheByte) {
         EXPECT_EQ(crc, row.crc) << row.units;
     }
     EXPECT_EQ(Pack(files[0], 2).u32(nextVobu), 0x3FFFFFFF) << "the end of a cell";
-    EXPECT_EQ(Pack(files[0], 9).u32(nextVobu), 0xBFFFFFF7) << "a cell goes on in a file that counts from 0";
+    EXPECT_EQ(Pack(files[0], 9).u32(nextVobu), 0xBFFFFFF7) << "a cell continues in a file that counts from 0";
 }
 
 TEST(NavigationTables, GapsWithoutVideoAreSeenAtAFixedPoint) {

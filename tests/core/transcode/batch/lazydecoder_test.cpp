@@ -159,7 +159,7 @@ TEST(LazyDecoder, ASourceThatFailedIsNotTakenOver) {
     EXPECT_EQ(sources.opened, 2);
 }
 
-// What has changed the source can't be done again, so it stays open beside the others.
+// What has changed the source can't be done again, so it stays open with the others.
 TEST(LazyDecoder, AChangedSourceStaysOpen) {
     Sources sources;
     const auto others = std::make_shared<OpenDecoders>(1);

@@ -259,7 +259,7 @@ TEST_F(BatchDecoder, ShortSoundIsFilledAndLongSoundIsDropped) {
     }
 }
 
-// A read stops at the last sample of a segment and goes on in the next one, for each stream by itself.
+// A read stops at the last sample of a segment and continues in the next one, for each stream by itself.
 TEST_F(BatchDecoder, SoundAloneIsJoinedToTheSample) {
     joined.addOutputAudioStream(sound(44100));
     joined.addOutputAudioStream(sound(44100));

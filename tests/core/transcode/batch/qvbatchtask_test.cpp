@@ -327,7 +327,7 @@ TEST_F(Joined, AFileThatIsNotListedIsOpenedWithTheDefaultsOfItsKind) {
     EXPECT_EQ(levels(written(".raw")).size(), 20u);
 }
 
-// One decoder serves a file, unless a stream of it is used twice; a slot that nothing feeds stays empty.
+// One decoder reads a file, unless a stream of it is used twice; a slot that nothing feeds stays empty.
 TEST_F(Joined, DecodersAreSharedWithinASegment) {
     state_.set("encoder", output(3));
     const auto streams = [&](const AnyDict& picture, const AnyDict& sound) {

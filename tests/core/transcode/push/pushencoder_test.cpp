@@ -44,7 +44,8 @@ void writeSamples(QvPushEncoder& push, int count, unsigned seed, std::string& al
     all += soundBytes(pcm);
 }
 
-// Buffers too small for their writers, two of which run beside the worker: nothing is lost, nothing doubled.
+// Buffers too small for their writers, two of which run at the same time as the worker: nothing is lost,
+// nothing doubled.
 TEST_F(Pushing, EverythingArrives) {
     constexpr int frames = 60, before = 20;
     LogCapture log;
@@ -107,7 +108,7 @@ TEST_F(Pushing, FormatsAreChecked) {
 }
 
 // Before and after the start, while the worker waits for either kind, while it works, while others write; and
-// the same object goes on in a new run.
+// the same object continues in a new run.
 TEST_F(Pushing, CloseAtEveryMoment) {
     QvPushEncoder push;
     EXPECT_EQ(push.close(true), 0);

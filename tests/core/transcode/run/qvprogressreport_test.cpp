@@ -7,7 +7,7 @@
 
 namespace {
 
-// What is told in 8 rounds of half a second each, as "round:percent".
+// What is reported in 8 rounds of half a second each, as "round:percent".
 std::string told(const AnyDict& settings, int total, double offset = 0, double scale = 1) {
     QvProgressReport report(settings, total, 4.0);
     report.setPass(offset, scale);

@@ -64,7 +64,7 @@ TEST_F(Transcoder, EachFrameBringsItsSamples) {
     }
 }
 
-// How a run ends and who gets to know what.
+// How a run ends, and which callbacks get which result.
 TEST_F(Transcoder, EveryEndHasItsOwnResult) {
     const struct {
         std::function<void(LinkedJob&)> arrange;

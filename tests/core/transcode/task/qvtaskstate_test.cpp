@@ -72,7 +72,7 @@ TEST(QvTaskState, SegmentsAreCountedOverTheStreamsThatHaveSources) {
     QvTaskState kept = stateOf({1}, {"ab"});
     EXPECT_EQ(kept.nrSegments(), 2);
     kept.set("streams", AnyVector());
-    EXPECT_EQ(kept.nrSegments(), 2) << "who changes the streams removes the count";
+    EXPECT_EQ(kept.nrSegments(), 2) << "code that changes the streams removes the count";
     EXPECT_EQ(QvTaskState(static_cast<const AnyDict&>(kept)).nrSegments(), 0) << "a count from elsewhere";
 }
 

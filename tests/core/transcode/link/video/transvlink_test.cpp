@@ -133,7 +133,7 @@ TEST(TransVLink, FailuresComeOut) {
         ASSERT_EQ(job.open(), row.open);
         if (row.open == 0) {
             EXPECT_EQ(job.run(), row.run);
-            EXPECT_EQ(job.link.close(), row.run == 0 ? -3 : 0) << "what nothing told before";
+            EXPECT_EQ(job.link.close(), row.run == 0 ? -3 : 0) << "what nothing reported before";
         }
         EXPECT_NE(std::string(job.link.errorDesc()).find(row.text), std::string::npos);
         EXPECT_NE(job.link.errorCode(), 0);
