@@ -86,8 +86,10 @@ void P2Dec::fillMeta(AnyDict& meta) const {
     if (take_.empty()) return;
     const P2Clip& first = take_.front();
     meta.set("clipName", first.name.c_str());
+    meta.set("title", (first.userName.empty() ? first.name : first.userName).c_str());
     if (!first.userName.empty()) meta.set("userClipName", first.userName.c_str());
-    if (!first.startTimecode.empty()) meta.set("startTimecode", first.startTimecode.c_str());
+    if (first.startTimecode.empty()) return;
+    for (const char* key : {"startTimecode", "timecode"}) meta.set(key, first.startTimecode.c_str());
 }
 
 void P2Dec::getParam(const char* name, Any& value) const {
@@ -145,7 +147,7 @@ int P2Dec::open() {
     return QvDecodePipe::open();
 }
 
-std::string P2Dec::openEssence(const Any& file, P2Stream& stream) const {
+std::string P2Dec::openEssence(const Any& file, const P2Length& said, P2Stream& stream) const {
     const std::string name = "'" + textOf(file) + "': ";
     if (qv_registry()->decoders("mxf").empty())
         return name + "there is no decoder for MXF files here; a plug-in has to bring one";
@@ -159,7 +161,7 @@ std::string P2Dec::openEssence(const Any& file, P2Stream& stream) const {
         },
         reason);
     if (!decoder) return name + (reason.empty() ? "it can't be opened" : reason);
-    const std::string fault = stream.append(std::move(decoder));
+    const std::string fault = stream.append(std::move(decoder), said);
     return fault.empty() ? fault : name + fault;
 }
 
@@ -172,11 +174,11 @@ std::string P2Dec::openStreams() {
         if (part.sounds.size() != sounds)
             return "the part '" + part.name + "' has " + std::to_string(part.sounds.size()) +
                    " sounds, not " + std::to_string(sounds) + " as of the part before it";
-        if (const std::string fault = openEssence(part.picture, *streams_.front());
+        if (const std::string fault = openEssence(part.picture, part.length, *streams_.front());
             !fault.empty())
             return fault;
         for (std::size_t i = 0; i < sounds; ++i)
-            if (const std::string fault = openEssence(part.sounds[i], *streams_[i + 1]);
+            if (const std::string fault = openEssence(part.sounds[i], part.length, *streams_[i + 1]);
                 !fault.empty())
                 return fault;
     }

@@ -2,7 +2,7 @@
 //
 // Opened by the clip's document (CONTENTS/CLIP/NAME.XML) or by the folder of a card that holds one clip; any
 // other XML document is refused without a line in the log for users. The picture and the sounds are MXF
-// files, which decoders for "mxf" read. The parts
+// files, which decoders for "mxf" read; one that is shorter than its document says is "truncated". The parts
 // of a take that lies on several cards are joined, wherever in it the document is: each part's sound begins
 // with its picture, cut or with silence after it.
 //
@@ -65,7 +65,7 @@ class P2Dec : public QvDecodePipe {
     int noStream(const char* operation);
     int noted(int result, const P2Stream& stream);
     int refuse(const P2Fault& fault);
-    std::string openEssence(const Any& file, P2Stream& stream) const;
+    std::string openEssence(const Any& file, const P2Length& said, P2Stream& stream) const;
     std::string openStreams();
     void fillMeta(AnyDict& meta) const;
 };
