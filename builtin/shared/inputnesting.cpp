@@ -9,11 +9,13 @@
 
 namespace {
 
-// Keeps what the factory said last of a file that it could not open.
+// Keeps what the factory said last of a file that it could not open, and after it what the decoder said.
 struct Reason : QvFileOpenCb {
     std::string text;
     int fileOpenFinished(int result, QvFileOpenCbData& data) override {
-        if (result != QvStatus::ok) text = data.text.toString().asString("");
+        if (result == QvStatus::ok) return QvStatus::ok;
+        text = data.text.toString().asString("");
+        if (data.reason.isText()) text += std::string(" ") + data.reason.toString().asString("");
         return QvStatus::ok;
     }
 };

@@ -48,6 +48,10 @@ class Reporter {
         started();
     }
     void failed(const Any& text) { finished(QvStatus::failed, text, 0); }
+    void failed(const Any& text, const QvDecodePipe& decoder) {
+        if (*decoder.errorDesc()) data_.reason = decoder.errorDesc();
+        failed(text);
+    }
     void succeeded(const Any& text, int percent) { finished(QvStatus::ok, text, percent); }
 
   private:
@@ -58,6 +62,7 @@ class Reporter {
         data_.text = text;
         data_.percent = percent;
         if (callback_) callback_->fileOpenFinished(result, data_);
+        data_.reason.invalidate();
     }
 };
 
@@ -211,7 +216,7 @@ QvDecodePipe* QvDecFactory::decodePipeUsing(const Any& filename, const AnyVector
         }
         const Any text = failedToOpen(filename, decoder->name());
         logError(text);
-        reporter.failed(text);
+        reporter.failed(text, *decoder);
     }
     return nullptr;
 }
@@ -298,7 +303,12 @@ QvDecodePipe* QvDecFactory::restoreDecoder(const Any& filename, const AnyDict& s
     if (!decoder) return fail(noInstance(name));
     decoder->restore(state);
     decoder->setParam("filename", filename);
-    if (decoder->open() != QvStatus::ok) return fail(failedToOpen(filename, decoder->name()));
+    if (decoder->open() != QvStatus::ok) {
+        const Any text = failedToOpen(filename, decoder->name());
+        logError(text);
+        reporter.failed(text, *decoder);
+        return nullptr;
+    }
 
     applyOverrides(*decoder, qvVideoStream, state["vidsOverride"]);
     applyOverrides(*decoder, qvAudioStream, state["audsOverride"]);

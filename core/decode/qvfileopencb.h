@@ -10,6 +10,7 @@ struct QV_API QvFileOpenCbData {
     Any moduleName;   // the decoder being tried; invalid until the first one
     Any text;         // message of the last failure, or of the success; invalid before
     int percent = 0;  // 100 at the success of decodePipe and decodePipeUsing
+    Any reason;       // with a failure: what the decoder itself said of it; invalid if it said nothing
 };
 
 // An application derives from it what it wants to know. Results are ignored. The calls come on the thread

@@ -17,7 +17,7 @@ std::string messageOf(const QvException& failure) {
 
 // Plug-ins' profiles have no symbol.
 Any symbolOf(int profile) {
-    const char* symbol = qvProfileToSym(profile);
+    const char* symbol = qvProfileToSym(qvFixOldProfileNo(profile));
     return *symbol ? Any(symbol) : Any::sprintf("0x%X", static_cast<unsigned>(profile));
 }
 

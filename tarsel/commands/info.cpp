@@ -114,6 +114,8 @@ Json describe(const Source& source) {
             file["streams"].push_back(describeStream(source.decoder(), type, i));
     const std::string damage = source.damage();
     if (!damage.empty()) file["damage"] = damage;
+    const Any meta = source.decoder().QvCodec::getParam("meta");
+    if (meta.isDict() && !meta.asDict().empty()) file["meta"] = plainJson(meta.asDict());
     describeWords(source.decoder(), file);
     return file;
 }
@@ -174,6 +176,10 @@ void printWords(const Json& file) {
     const auto part = [](const Json& object, const char* key) {
         return object.contains(key) ? oneLine(object[key]) : std::string();
     };
+    if (file.contains("meta"))
+        for (const auto& [label, key] :
+             {std::pair("title", "title"), {"clip", "clipName"}, {"timecode", "timecode"}})
+            printWord(label, part(file["meta"], key));
     if (file.contains("bext")) {
         const Json& bext = file["bext"];
         printWord("about", part(bext, "description"));

@@ -3,6 +3,7 @@
 #include "tarsel/commands/outputoptions.h"
 #include "tarsel/host/console.h"
 #include "tarsel/host/events.h"
+#include "tarsel/host/files.h"
 #include "tarsel/host/outputs/outputs.h"
 #include "tarsel/host/signals.h"
 #include "tarsel/presets/outputpreset.h"
@@ -193,16 +194,16 @@ void exportTo(const Given& given, Signals& signals) {
 
 void check(const Given& given) {
     QvUserPresets presets;
-    if (given.words.empty())
-        presets = PresetStore::read();
-    else
-        loadPresets(given.words[0], presets, QvUserPresets::clearFirst);
-    const int valid = presets.checkPresets(QvUserPresets::describeInvalid);
+    std::vector<std::string> skipped;
+    const std::string file = given.words.empty() ? PresetStore::fileName() : given.words[0];
+    if (!given.words.empty() || exists(file)) skipped = loadPresets(file, presets);
+    for (const std::string& line : skipped) tell(Level::warning, inLine(line));
+    // As they are used.
+    const int valid = presets.checkPresets(QvUserPresets::describeInvalid | QvUserPresets::substituteModules);
     for (int i = 0; i < presets.count(); ++i)
         if (QvPreset preset = presets.at(i); !preset.isValid())
             tell(Level::warning, inQuotes(preset.name()) + ": " + inLine(onOneLine(faultOf(preset))));
-    const int invalid = presets.count() - valid;
-    const std::string file = given.words.empty() ? PresetStore::fileName() : given.words[0];
+    const int invalid = presets.count() - valid + static_cast<int>(skipped.size());
     if (invalid > 0) throw failure(Msg::presetsInvalid, {file, std::to_string(invalid)});
     say(presetsText(valid) + (valid == 1 ? " is sound" : " are sound"));
 }

@@ -7,6 +7,7 @@
 #include "tarsel/host/signals.h"
 #include "tarsel/job/job.h"
 #include "tarsel/job/plan/outputform.h"
+#include "tarsel/job/post.h"
 #include "tarsel/words/commandline.h"
 #include "tarsel/words/messages.h"
 #include "tarsel/words/rawnames.h"
@@ -50,7 +51,10 @@ void checkMuxer(const JobOptions& job) {
 void takeStandardInput(Given& given) {
     JobOptions& job = given.job;
     job.standardInput = standardInputOf(job.inputs, given.inputFormat);
-    if (job.standardInput && !job.saveTask.empty()) throw failure(Msg::stdinRefuses, {"--save-task"});
+    if (!job.standardInput) return;
+    if (!job.saveTask.empty()) throw failure(Msg::stdinRefuses, {"--save-task"});
+    if (postNames(job.post, job.inputs, StandardInput::kName))
+        throw failure(Msg::stdinRefuses, {"--post with %i"});
 }
 
 }  // namespace

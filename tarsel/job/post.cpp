@@ -1,5 +1,6 @@
 #include "tarsel/job/post.h"
 
+#include <algorithm>
 #include <filesystem>
 
 #include <qvplugcore/qvplugcore.h>
@@ -67,6 +68,12 @@ std::string postCommand(const std::string& command, const std::vector<std::strin
         }
     }
     return result;
+}
+
+bool postNames(const std::string& command, const std::vector<std::string>& inputs, const std::string& input) {
+    std::vector<std::string> others = inputs;
+    std::replace(others.begin(), others.end(), input, input + "x");
+    return postCommand(command, inputs, {}) != postCommand(command, others, {});
 }
 
 void runPost(const PostJob& job, Signals& signals) {

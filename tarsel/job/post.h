@@ -12,6 +12,9 @@
 std::string postCommand(const std::string& command, const std::vector<std::string>& inputs,
                         const std::vector<std::string>& outputs);
 
+// Whether this input's name would be in the command that is run.
+bool postNames(const std::string& command, const std::vector<std::string>& inputs, const std::string& input);
+
 struct PostJob {
     const std::string& command;
     const std::vector<std::string>& inputs;

@@ -12,27 +12,6 @@ namespace {
 
 constexpr int kOlderForm = 1;
 
-// The reader says in the log which presets of the older form it leaves out.
-class SkipLog : public QvLogBase {
-  public:
-    SkipLog() : before_(qv_dbg()->logger()) { qv_dbg()->setLogger(this); }
-    SkipLog(const SkipLog&) = delete;
-    SkipLog& operator=(const SkipLog&) = delete;
-    ~SkipLog() override { qv_dbg()->setLogger(before_); }
-
-    // A line begins with its time.
-    void logs(int mask, const unsigned short* text) override {
-        if (before_) before_->logs(mask, text);
-        std::string line = Any(text).toString().asString("");
-        line.erase(0, line.find(' ') + 1);
-        if (line.starts_with("Skipping preset")) lines.push_back(line);
-    }
-    std::vector<std::string> lines;
-
-  private:
-    QvLogBase* before_;
-};
-
 std::string cleanName(const std::string& given) {
     const std::string name = presetNameOf(given);
     return name.empty() ? "preset" : name;
@@ -71,11 +50,7 @@ ImportReport importPresets(const std::string& file, bool overwrite, QvUserPreset
     ImportReport report;
     QvUserPresets fresh;
     int form = 0;
-    {
-        SkipLog log;
-        loadPresets(file, fresh, QvUserPresets::clearFirst, &form);
-        report.skipped = log.lines;
-    }
+    report.skipped = loadPresets(file, fresh, &form);
     Names names(presets);
     for (int i = 0; i < fresh.count(); ++i) {
         QvPreset preset = fresh.at(i);

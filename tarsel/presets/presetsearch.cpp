@@ -48,14 +48,6 @@ const Row* find(const std::vector<Row>& rows, const std::string& name) {
     return nullptr;
 }
 
-// A preset of the user whose missing modules have given way to those that can stand in for them.
-QvPreset withInstalledModules(const QvPreset& preset) {
-    QvUserPresets one;
-    one.append(preset);
-    one.checkPresets(QvUserPresets::substituteModules);
-    return one.at(0);
-}
-
 // Near names are found in small letters, and shown as they are.
 std::string nearMatches(const std::string& name, const std::vector<Known>& all) {
     std::vector<std::string> words, small;
@@ -100,6 +92,13 @@ QvPreset findPreset(const std::string& name) {
     if (!found) throw failure(Msg::presetUnknown, {name, nearMatches(name, all)});
     if (!found->preset) throw failure(Msg::presetWaits, {found->name, found->waitsFor});
     return found->preset->isCustom() ? withInstalledModules(*found->preset) : *found->preset;
+}
+
+QvPreset withInstalledModules(const QvPreset& preset) {
+    QvUserPresets one;
+    one.append(preset);
+    one.checkPresets(QvUserPresets::substituteModules);
+    return one.at(0);
 }
 
 int presetPlace(const QvUserPresets& presets, const std::string& name) {

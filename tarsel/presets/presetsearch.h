@@ -11,6 +11,9 @@
 // waits for.
 QvPreset findPreset(const std::string& name);
 
+// A preset of the user whose missing modules have given way to those that can stand in for them; checked.
+QvPreset withInstalledModules(const QvPreset& preset);
+
 // The place of a user's preset in a list, or -1.
 int presetPlace(const QvUserPresets& presets, const std::string& name);
 // The place of a user's preset in a list; throws Failure, with near matches, if there is none.

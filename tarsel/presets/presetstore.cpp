@@ -9,7 +9,32 @@
 #include "tarsel/host/outputs/sharedfile.h"
 #include "tarsel/words/messages.h"
 
-void loadPresets(const std::string& file, QvUserPresets& presets, int mode, int* form) {
+namespace {
+
+// The reader says in the log which presets of the older form it leaves out.
+class SkipLog : public QvLogBase {
+  public:
+    SkipLog() : before_(qv_dbg()->logger()) { qv_dbg()->setLogger(this); }
+    SkipLog(const SkipLog&) = delete;
+    SkipLog& operator=(const SkipLog&) = delete;
+    ~SkipLog() override { qv_dbg()->setLogger(before_); }
+
+    // A line begins with its time.
+    void logs(int mask, const unsigned short* text) override {
+        if (before_) before_->logs(mask, text);
+        std::string line = Any(text).toString().asString("");
+        line.erase(0, line.find(' ') + 1);
+        if (line.starts_with("Skipping preset")) lines.push_back(line);
+    }
+    std::vector<std::string> lines;
+
+  private:
+    QvLogBase* before_;
+};
+
+}  // namespace
+
+std::vector<std::string> loadPresets(const std::string& file, QvUserPresets& presets, int* form) {
     requireInput(file);
     const MemoryWatch memory;
     const Any name(file.c_str());
@@ -18,12 +43,14 @@ void loadPresets(const std::string& file, QvUserPresets& presets, int mode, int*
     if (!fault.empty()) throw failure(Msg::presetsDamaged, {file, fault});
     // An element of the older form that is no preset is left out; the others stay.
     int version = 0;
-    presets.load(name, mode, &version);
+    const SkipLog log;
+    presets.load(name, QvUserPresets::clearFirst, &version);
     if (version == 0) throw failure(Msg::presetsDamaged, {file, "it changed while it was read"});
     // Whatever a file says, what is in it is a user's.
     for (Any& preset : presets)
         if (preset.isDict()) preset.asDict().set("custom", 1);
     if (form) *form = version;
+    return log.lines;
 }
 
 void storePresets(const std::string& file, QvUserPresets& presets) {
@@ -43,14 +70,16 @@ std::string PresetStore::fileName() {
 
 QvUserPresets PresetStore::read() {
     QvUserPresets presets;
-    if (const std::string file = fileName(); exists(file))
-        loadPresets(file, presets, QvUserPresets::clearFirst);
+    if (const std::string file = fileName(); exists(file)) loadPresets(file, presets);
     return presets;
 }
 
 void PresetStore::change(const std::function<void(QvUserPresets& presets)>& change) {
     SharedFile file(fileName());
-    QvUserPresets presets = read();
+    QvUserPresets presets;
+    if (exists(fileName()))
+        if (const auto skipped = loadPresets(fileName(), presets); !skipped.empty())
+            throw failure(Msg::presetsDamaged, {fileName(), skipped.front()});
     const QvUserPresets before = presets;
     change(presets);
     if (presets != before) file.replace([&](const std::string& name) { storePresets(name, presets); });

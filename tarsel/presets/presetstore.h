@@ -3,6 +3,7 @@
 
 #include <functional>
 #include <string>
+#include <vector>
 
 #include <qvplugcore/qvplugcore.h>
 
@@ -15,12 +16,15 @@ std::string fileName();
 QvUserPresets read();
 
 // Reads, lets `change` do its work, and stores the result if it differs. Other runs wait meanwhile. What
-// `change` throws leaves the file as it was. Throws Failure.
+// `change` throws leaves the file as it was. Throws Failure, also for a file of the older form of which
+// something would be left out and so be lost.
 void change(const std::function<void(QvUserPresets& presets)>& change);
 
 }  // namespace PresetStore
 
-// Presets of any file, added to a list. Throws Failure (input) for a file that holds none or is damaged.
-void loadPresets(const std::string& file, QvUserPresets& presets, int mode, int* form = nullptr);
+// Exchanges a list for the presets of any file; `form` receives 1 or 2 for its form. Returns a line for each
+// preset of the older form that is left out, and why. Throws Failure (input) for a file that holds none or is
+// damaged.
+std::vector<std::string> loadPresets(const std::string& file, QvUserPresets& presets, int* form = nullptr);
 // Throws Failure (output).
 void storePresets(const std::string& file, QvUserPresets& presets);

@@ -3,6 +3,7 @@
 #include <vector>
 
 #include "tarsel/presets/outputpreset.h"
+#include "tarsel/presets/presetsearch.h"
 #include "tarsel/presets/presetwords.h"
 #include "tarsel/words/failure.h"
 #include "tarsel/words/timespec.h"
@@ -32,7 +33,7 @@ Json rowOf(const QvPreset& preset, const std::string& group) {
 
 void addOwn(const QvUserPresets& own, bool all, Json& rows) {
     for (int i = 0; i < own.count(); ++i) {
-        QvPreset preset = own.at(i);
+        QvPreset preset = withInstalledModules(own.at(i));
         if (preset.isDisabled() && !all) continue;
         Json row = rowOf(preset, kOwnGroup);
         preset.createInfo();

@@ -15,16 +15,18 @@ struct Range {
     std::string owner;
 };
 
-// A preset's range wins.
-Range rangeOf(const QvPreset* preset, const QvCodec& encoder, const char* name) {
+// That of the preset, and that of the encoder: a value has to be in both.
+std::vector<Range> rangesOf(const QvPreset* preset, const QvCodec& encoder, const char* name) {
+    std::vector<Range> ranges;
     if (const auto meta = preset ? preset->presetMeta() : std::nullopt; meta && meta->isSet(name))
-        return {meta->get(name), "the preset " + inQuotes(preset->name())};
-    if (isRawEncoder(encoder)) return {};
+        ranges.push_back({meta->get(name), "the preset " + inQuotes(preset->name())});
+    if (isRawEncoder(encoder)) return ranges;
     try {
-        return {encoder.getParam(name), std::string("the encoder '") + encoder.name() + "'"};
+        ranges.push_back({encoder.getParam(name), std::string("the encoder '") + encoder.name() + "'"});
     } catch (const QvParamException&) {
-        return {};
+        // It names none.
     }
+    return ranges;
 }
 
 [[noreturn]] void refuse(const char* option, const std::string& value, const Range& range,
@@ -85,13 +87,19 @@ void checkNumber(const char* option, const Range& range, int value) {
 
 void checkPictureRanges(const QvPreset* preset, const QvCodec& encoder, int width, int height,
                         const QvFramerate& rate) {
-    checkSize(rangeOf(preset, encoder, "sizeRange"), width, height);
-    checkRate(rangeOf(preset, encoder, "framerateRange"), rate);
+    for (const Range& range : rangesOf(preset, encoder, "sizeRange")) checkSize(range, width, height);
+    for (const Range& range : rangesOf(preset, encoder, "framerateRange")) checkRate(range, rate);
 }
 
 void checkSoundRanges(const QvPreset* preset, const QvCodec& encoder, int samplerate, int channels,
                       int bits) {
-    checkNumber("--samplerate", rangeOf(preset, encoder, "samplerateRange"), samplerate);
-    checkNumber("--channels", rangeOf(preset, encoder, "channelsRange"), channels);
-    checkNumber("--bits", rangeOf(preset, encoder, "bitsPerSampleRange"), bits);
+    const struct {
+        const char *option, *range;
+        int value;
+    } rows[] = {{"--samplerate", "samplerateRange", samplerate},
+                {"--channels", "channelsRange", channels},
+                {"--bits", "bitsPerSampleRange", bits}};
+    for (const auto& row : rows)
+        for (const Range& range : rangesOf(preset, encoder, row.range))
+            checkNumber(row.option, range, row.value);
 }

@@ -369,7 +369,10 @@ std::string Source::decoderName() const {
 
 long long Source::bytes() const {
     if (standard_) return standard_->bytes();
-    return isFile_ ? fileBytes(name_) : -1;
+    if (!isFile_) return -1;
+    // A document that names other files stands for them.
+    const Any all = open_->QvCodec::getParam("filesize");
+    return std::max(fileBytes(name_), all.isInt() ? all.toInt64() : 0);
 }
 
 std::optional<QvFramerate> Source::frameRate() const {

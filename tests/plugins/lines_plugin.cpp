@@ -1,6 +1,7 @@
-// A plug-in with a video encoder under names that presets wait for. It writes a line of text for each
-// picture, and takes few sizes and rates. "dvmux" can be planned with. A preset of its own leaves the
-// choice between two multiplexers.
+// A plug-in with a video encoder under names that presets wait for; QV_LINES_NAME replaces "h264venc". It
+// writes a line of text for each picture, and takes few sizes and rates. "dvmux" can be planned with. A
+// preset of its own leaves the choice between two multiplexers.
+#include <cstdlib>
 #include <memory>
 #include <string>
 #include <utility>
@@ -98,7 +99,8 @@ QV_API unsigned qv_plugin_abi = qvPluginAbi;
 extern "C" QV_API QvPlugin* plugin_init() {
     static QvPlugin plugin("lines", "An encoder that presets wait for");
     if (plugin.nrModules() == 0) {
-        plugin.addModule(new Module("h264venc"));
+        const char* const other = std::getenv("QV_LINES_NAME");
+        plugin.addModule(new Module(other ? other : "h264venc"));
         plugin.addModule(new Module("dvvenc"));
         plugin.addModule(new Multiplexer);
     }

@@ -12,6 +12,7 @@ struct P2CardClip {
     std::vector<int> samples{9600, 9600};  // of each sound, whose seeds are 1000, 2000, ...
     std::string previous = {}, next = {};  // names of other clips
     std::string timecode = "01:02:03:04";
+    int duration = 0;  // that the document says, in frames at 25 a second; 0: nothing
 };
 
 inline void writeText(const std::filesystem::path& name, const std::string& text) {
@@ -23,9 +24,12 @@ inline void writeText(const std::filesystem::path& name, const std::string& text
 inline std::string writeP2Clip(const std::filesystem::path& card, const P2CardClip& clip) {
     const std::filesystem::path contents = card / "CONTENTS";
     const auto id = [](const std::string& name) { return "<GlobalClipID>ID-" + name + "</GlobalClipID>"; };
-    std::string text = "<?xml version=\"1.0\"?>\n<P2Main xmlns=\"urn:clip\"><ClipContent>\n<ClipName>" +
-                       clip.name + "</ClipName>" + id(clip.name) + "<EssenceList><Video><StartTimecode>" +
-                       clip.timecode + "</StartTimecode></Video>";
+    std::string text =
+        "<?xml version=\"1.0\"?>\n<P2Main xmlns=\"urn:clip\"><ClipContent>\n<ClipName>" + clip.name +
+        "</ClipName>" + id(clip.name) +
+        (clip.duration ? "<Duration>" + std::to_string(clip.duration) + "</Duration><EditUnit>1/25</EditUnit>"
+                       : "") +
+        "<EssenceList><Video><StartTimecode>" + clip.timecode + "</StartTimecode></Video>";
     for (std::size_t i = 0; i < clip.samples.size(); ++i) {
         text += "<Audio/>";
         writeText(contents / "AUDIO" / (clip.name + (i < 10 ? "0" : "") + std::to_string(i) + ".MXF"),

@@ -217,6 +217,13 @@ TEST_F(Presets, FilesOfOthersAreTakenWithCare) {
                 AllOf(HasSubstr("'Gone' is hidden"), HasSubstr("kipping preset, it is no dictionary"),
                       HasSubstr("imported 1 of 2")));
     EXPECT_THAT(works({"presets"}).out, Not(HasSubstr("Gone")));
+    const Outcome lost = tarsel({"presets", "check", "old.xml"});
+    EXPECT_THAT(lost.err, AllOf(HasSubstr("kipping preset, it is no dictionary"), HasSubstr("2 of them")));
+    EXPECT_EQ(lost.status, 5);
+    // A store of the older form is not written anew without what can't be read of it.
+    fs::copy_file(folder.file("old.xml"), folder.file(store()), fs::copy_options::overwrite_existing);
+    fails(3, {"presets", "save", "Web"}, {"presets.xml'", "kipping preset"});
+    EXPECT_EQ(contents(store()), contents("old.xml"));
 
     // A folder that can't be made is named itself.
     folder.write("plain", "");
@@ -293,6 +300,20 @@ TEST_F(Presets, LightUpWithTheModulesOfPlugins) {
     fails(2, coded(job + Words{"-o", "w.yuv", "--preset", "h.264 main"}), {"'w.yuv'"});
     // The other multiplexer of an extension does where the first one is missing.
     EXPECT_THAT(works(coded(job + Words{"-o", "x.dv", "--dry-run"})).out, HasSubstr("dvmux"));
+    // Both the preset's range and the encoder's hold.
+    folder.write("ranges.xml",
+                 "<UserPresets version=\"2.0\"><dict><key>presets</key><vec><Preset version=\"2.0\" "
+                 "name=\"Narrow\"><key>custom</key><i32>1</i32><key>profile</key><i32>" +
+                     std::to_string(0x2160003) +
+                     "</i32><key>PresetMeta</key><dict><key>sizeRange</key><dict><key>wmin</key>"
+                     "<i32>100</i32><key>wmax</key><i32>2000</i32></dict></dict></Preset></vec></dict>"
+                     "</UserPresets>");
+    works(coded({"presets", "import", "ranges.xml"}));
+    const Words narrow = job + Words{"--preset", "narrow", "-o", "n.h264", "--size"};
+    fails(2, coded(narrow + Words{"96x96"}), {"the preset 'Narrow'", "100x"});
+    fails(2, coded(narrow + Words{"800x480"}), {"the encoder 'h264venc'", "720x576"});
+    works(coded(narrow + Words{"160x96"}));
+    works({"presets", "remove", "narrow"});
     works(coded({"presets", "save", "Small", "--preset", "h264_high", "--size", "64x48"}));
     works(coded(job + Words{"-o", "s.h264", "--preset", "small"}));
     EXPECT_EQ(contents("s.h264").substr(0, 6), "64x48\n");
@@ -308,6 +329,11 @@ TEST_F(Presets, LightUpWithTheModulesOfPlugins) {
         json::parse(works(coded({"presets", "show", "One", "--json"})).out)["settings"]["muxer"]["name"],
         "rawmux");
     EXPECT_THAT(works(coded({"presets", "show", "One"})).out, HasSubstr("0x2800010"));
+    // A module that can stand in for a missing one.
+    setenv("QV_LINES_NAME", "bch264venc", 1);
+    EXPECT_THAT(works(coded({"presets"})).out, Not(HasSubstr("can't be used")));
+    works(coded({"presets", "check"}));
+    unsetenv("QV_LINES_NAME");
     for (const char* name : {"Two", "One"}) works({"presets", "remove", name});
     const Outcome gone = tarsel({"presets", "check"});
     EXPECT_EQ(gone.status, 5);

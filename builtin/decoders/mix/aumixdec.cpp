@@ -46,44 +46,25 @@ AudioMixDec::AudioMixDec(const QvModule* module) : BaseDecodePipe(module) {}
 AudioMixDec::~AudioMixDec() = default;
 
 int AudioMixDec::setParam(const char* name, const Any& value) {
-    if (std::strcmp(name, "filename") == 0) {
+    const bool isSettings = std::strcmp(name, "settings") == 0;  // of a stored state
+    std::string fault;
+    if (const auto result = source_.set(isSettings ? "openParameters" : name, value, fault)) {
         _traceParam(name, value);
-        if (!value.isText()) {
-            setError(QvStatus::invalidStructure, "Invalid value type for 'filename'");
-            QV_FAIL(errorDesc());
-        }
-        filename_ = value;
-        metaState_.clear();
-        return QvStatus::ok;
-    }
-    if (std::strcmp(name, "metaState") == 0) {
-        _traceParam(name, value);
-        if (!value.isDict())
-            return setError(QvStatus::invalidStructure, "Invalid value type for 'metaState'");
-        metaState_ = value.asDict();
-        if (!metaState_.empty()) filename_.invalidate();
-        return QvStatus::ok;
-    }
-    if (std::strcmp(name, "openParameters") == 0 || std::strcmp(name, "settings") == 0) {
-        _traceParam(name, value);
-        if (!value.isDict()) return QvStatus::invalidParam;
-        inputParams_ = value.asDict();
-        return QvStatus::ok;
+        if (!fault.empty()) setError(*result, "%s", fault.c_str());
+        if (!fault.empty() && std::strcmp(name, "filename") == 0) QV_FAIL(errorDesc());
+        return *result;
     }
     if (auto result = _setRow<Settings>(rows, settings_, name, value)) return *result;
     return BaseDecodePipe::setParam(name, value);
 }
 
 void AudioMixDec::getParam(const char* name, Any& value) const {
-    if (std::strcmp(name, "filename") == 0) {
-        value = filename_;
-    } else if (std::strcmp(name, "metaState") == 0) {
-        value = metaState_;
-    } else if (std::strcmp(name, "filesize") == 0) {
+    if (source_.get(name, value)) return;
+    if (std::strcmp(name, "filesize") == 0) {
         value.invalidate();
         if (getState() == stateOpen) getStreamParam(qvAudioStream, 0, "filesize", value);
     } else if (std::strcmp(name, "store") == 0) {
-        if (!inputParams_.empty()) value = AnyDict("settings", inputParams_);
+        if (!source_.openParams.empty()) value = AnyDict("settings", source_.openParams);
     } else if (std::strcmp(name, "inputFailure") == 0) {
         value = inputFailure_.c_str();
     } else if (!qvGetParamRow<Settings>(rows, settings_, name, value)) {
@@ -93,15 +74,15 @@ void AudioMixDec::getParam(const char* name, Any& value) const {
 
 // The set-up of the file becomes the state.
 int AudioMixDec::loadSetup() {
-    inputFailure_ = QvMetafile::check(filename_);
+    inputFailure_ = QvMetafile::check(source_.filename);
     QvAudioMixDecSetup setup;
     int result = notReadable;
     if (inputFailure_.empty()) {
-        result = setup.load(filename_);
+        result = setup.load(source_.filename);
         if (result != QvStatus::ok) inputFailure_ = "it holds no mix of sounds";
     } else {
         // Loading it might end in an assertion.
-        qv_log()->error("[audiomixdec]Failed to open %s, %s", shown(filename_).c_str(),
+        qv_log()->error("[audiomixdec]Failed to open %s, %s", shown(source_.filename).c_str(),
                         inputFailure_.c_str());
     }
     AnyDict state;
@@ -111,33 +92,34 @@ int AudioMixDec::loadSetup() {
         if (!inputFailure_.empty()) result = QvStatus::failed;
     }
     if (result != QvStatus::ok)
-        return setError(result, "[audiomixdec]Failed to open %s", shown(filename_).c_str());
-    metaState_ = std::move(state);
+        return setError(result, "[audiomixdec]Failed to open %s", shown(source_.filename).c_str());
+    source_.state = std::move(state);
     return QvStatus::ok;
 }
 
 int AudioMixDec::open() {
     if (getState() == stateOpen) close();
     inputFailure_.clear();
-    if (!filename_.isValid() && metaState_.empty()) {
+    if (!source_.filename.isValid() && source_.state.empty()) {
         setError(QvStatus::illegalState, "open: open parameters not defined");
         QV_FAIL(errorDesc());
     }
-    const InputNesting nesting(filename_);
+    const InputNesting nesting(source_.filename);
     const auto failed = [this](int code) {
         InputNesting::noteFailure(inputFailure_);
         return code;
     };
     if (!nesting.fault().empty()) {
         inputFailure_ = nesting.fault();
-        return failed(setError(QvStatus::failed, "[audiomixdec]Failed to open %s", shown(filename_).c_str()));
+        return failed(
+            setError(QvStatus::failed, "[audiomixdec]Failed to open %s", shown(source_.filename).c_str()));
     }
-    if (filename_.isValid())
+    if (source_.filename.isValid())
         if (const int result = loadSetup(); result != QvStatus::ok) return failed(result);
 
     auto stream = std::make_unique<Interleave>();
-    int result = stream->setup.restore(metaState_);
-    if (result == QvStatus::ok) result = stream->prepare(settings_.targetSamplerate, inputParams_);
+    int result = stream->setup.restore(source_.state);
+    if (result == QvStatus::ok) result = stream->prepare(settings_.targetSamplerate, source_.openParams);
     inputFailure_ = stream->inputFailure();
     if (result != QvStatus::ok)
         return failed(setError(

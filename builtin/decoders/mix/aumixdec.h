@@ -14,6 +14,7 @@
 
 #include <string>
 
+#include "builtin/shared/metainput.h"
 #include "core/decode/basedecodepipe.h"
 
 class Interleave;
@@ -36,10 +37,8 @@ class AudioMixDec : public BaseDecodePipe {
     QvPcm* getAudioPtr(int stream) override;
 
   private:
-    Any filename_;
-    AnyDict metaState_;
+    MetaInput source_{true};
     Settings settings_;
-    AnyDict inputParams_;
     std::string inputFailure_;
 
     int loadSetup();

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cctype>
+#include <charconv>
 #include <map>
 #include <set>
 
@@ -80,6 +81,22 @@ std::string timecodeIn(const std::string& text) {
     return text;
 }
 
+// A whole text of digits from 1 on, or 0.
+int numberIn(const std::string& text) {
+    int number = 0;
+    const char* const end = text.data() + text.size();
+    const auto read = std::from_chars(text.data(), end, number);
+    return read.ec == std::errc() && read.ptr == end ? std::max(number, 0) : 0;
+}
+
+// "25" units of "1/25" seconds.
+P2Length lengthIn(const std::string& duration, const std::string& unit) {
+    const std::size_t slash = unit.find('/');
+    if (slash == std::string::npos) return {};
+    const int num = numberIn(unit.substr(0, slash)), den = numberIn(unit.substr(slash + 1));
+    return num > 0 && den > 0 ? P2Length{numberIn(duration), num, den} : P2Length{};
+}
+
 P2Fault readDocument(const Any& document, P2Clip& clip) {
     const P2Fault foreign{"it is no document of a P2 clip", true};
     if (QvFile::flength(document) > maxDocumentBytes) return foreign;
@@ -98,6 +115,7 @@ P2Fault readDocument(const Any& document, P2Clip& clip) {
     clip.name = dataOf(childOf(content, "ClipName"));
     if (clip.name.empty()) return {"the document has no ClipName"};
     clip.id = dataOf(childOf(content, "GlobalClipID"));
+    clip.length = lengthIn(dataOf(childOf(content, "Duration")), dataOf(childOf(content, "EditUnit")));
     clip.userName = dataOf(childOf(childOf(content, "ClipMetadata"), "UserClipName"));
     const XmlNode* connection = childOf(childOf(content, "Relation"), "Connection");
     clip.previousId = dataOf(childOf(childOf(connection, "Previous"), "GlobalClipID"));

@@ -13,6 +13,13 @@
 
 #include "core/value/any.h"
 
+// `count` times `num` / `den` seconds; a count of 0 where it is not known.
+struct P2Length {
+    long long count = 0;
+    int num = 1;
+    int den = 1;
+};
+
 struct P2Clip {
     static constexpr int maxSounds = 16;
 
@@ -23,6 +30,7 @@ struct P2Clip {
     std::string startTimecode;  // "HH:MM:SS:FF", or with ";"; empty if there is none
     std::string previousId;     // of the clip before it in the take; empty at its start
     std::string nextId;
+    P2Length length;
     bool hasPicture = false;
     int nrSounds = 0;
     // Files, once they are found.

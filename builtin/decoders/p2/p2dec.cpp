@@ -67,17 +67,10 @@ P2Dec::~P2Dec() = default;
 
 int P2Dec::setParam(const char* name, const Any& value) {
     const auto is = [name](const char* other) { return std::strcmp(name, other) == 0; };
-    if (is("filename")) {
+    std::string fault;
+    if (const auto result = source_.set(name, value, fault)) {
         _traceParam(name, value);
-        if (!value.isText()) return setError(QvStatus::invalidStructure, "Invalid value type for 'filename'");
-        filename_ = value;
-        return QvStatus::ok;
-    }
-    if (is("openParameters")) {
-        _traceParam(name, value);
-        if (!value.isDict()) return QvStatus::invalidParam;
-        inputParams_ = value.asDict();
-        return QvStatus::ok;
+        return fault.empty() ? *result : setError(*result, "%s", fault.c_str());
     }
     if (is("settings")) {  // of a stored state
         if (!value.isDict()) return QvStatus::invalidParam;
@@ -93,15 +86,16 @@ void P2Dec::fillMeta(AnyDict& meta) const {
     if (take_.empty()) return;
     const P2Clip& first = take_.front();
     meta.set("clipName", first.name.c_str());
+    meta.set("title", (first.userName.empty() ? first.name : first.userName).c_str());
     if (!first.userName.empty()) meta.set("userClipName", first.userName.c_str());
-    if (!first.startTimecode.empty()) meta.set("startTimecode", first.startTimecode.c_str());
+    if (first.startTimecode.empty()) return;
+    for (const char* key : {"startTimecode", "timecode"}) meta.set(key, first.startTimecode.c_str());
 }
 
 void P2Dec::getParam(const char* name, Any& value) const {
     const auto is = [name](const char* other) { return std::strcmp(name, other) == 0; };
-    if (is("filename")) {
-        value = filename_;
-    } else if (is("foreign")) {
+    if (source_.get(name, value)) return;
+    if (is("foreign")) {
         value = foreign_ ? 1 : 0;
     } else if (is("clipName") || is("userClipName") || is("startTimecode") || is("meta")) {
         AnyDict meta;
@@ -120,7 +114,7 @@ void P2Dec::getParam(const char* name, Any& value) const {
         if (!streams_.empty()) value = Any(bytes);
     } else if (is("store")) {
         AnyDict settings("joinSpans", settings_.joinSpans ? 1 : 0);
-        if (!inputParams_.empty()) settings.set("openParameters", inputParams_);
+        if (!source_.openParams.empty()) settings.set("openParameters", source_.openParams);
         value = AnyDict("settings", settings);
     } else if (!qvGetParamRow<Settings>(rows, settings_, name, value)) {
         QvDecodePipe::getParam(name, value);
@@ -140,32 +134,34 @@ int P2Dec::refuse(const P2Fault& fault) {
 int P2Dec::open() {
     if (getState() == stateOpen) close();
     foreign_ = false;
-    if (!filename_.isValid()) return refuse({"open: open parameters not defined"});
-    const InputNesting nesting(filename_);
+    if (!source_.filename.isValid()) return refuse({"open: open parameters not defined"});
+    const InputNesting nesting(source_.filename);
     if (!nesting.fault().empty()) return refuse({nesting.fault()});
     Any document;
-    if (const P2Fault fault = p2FindDocument(filename_, document); !fault.empty()) return refuse(fault);
+    if (const P2Fault fault = p2FindDocument(source_.filename, document); !fault.empty())
+        return refuse(fault);
     if (const P2Fault fault = p2ReadTake(document, settings_.joinSpans, take_); !fault.empty())
         return refuse(fault);
     if (const std::string fault = openStreams(); !fault.empty()) return refuse({fault});
-    filename_ = document;
+    source_.filename = document;
     return QvDecodePipe::open();
 }
 
-std::string P2Dec::openEssence(const Any& file, P2Stream& stream) const {
+std::string P2Dec::openEssence(const Any& file, const P2Length& said, P2Stream& stream) const {
     const std::string name = "'" + textOf(file) + "': ";
     if (qv_registry()->decoders("mxf").empty())
         return name + "there is no decoder for MXF files here; a plug-in has to bring one";
     std::string reason;
-    const Any params = inputParams_;
+    const Any params = source_.openParams;
     auto decoder = InputNesting::open(
         file,
         [&](QvFileOpenCb* callback) {
-            return QvDecFactory::decodePipe(file, Any(), callback, inputParams_.empty() ? nullptr : &params);
+            return QvDecFactory::decodePipe(file, Any(), callback,
+                                            source_.openParams.empty() ? nullptr : &params);
         },
         reason);
     if (!decoder) return name + (reason.empty() ? "it can't be opened" : reason);
-    const std::string fault = stream.append(std::move(decoder));
+    const std::string fault = stream.append(std::move(decoder), said);
     return fault.empty() ? fault : name + fault;
 }
 
@@ -178,10 +174,12 @@ std::string P2Dec::openStreams() {
         if (part.sounds.size() != sounds)
             return "the part '" + part.name + "' has " + std::to_string(part.sounds.size()) +
                    " sounds, not " + std::to_string(sounds) + " as of the part before it";
-        if (const std::string fault = openEssence(part.picture, *streams_.front()); !fault.empty())
+        if (const std::string fault = openEssence(part.picture, part.length, *streams_.front());
+            !fault.empty())
             return fault;
         for (std::size_t i = 0; i < sounds; ++i)
-            if (const std::string fault = openEssence(part.sounds[i], *streams_[i + 1]); !fault.empty())
+            if (const std::string fault = openEssence(part.sounds[i], part.length, *streams_[i + 1]);
+                !fault.empty())
                 return fault;
     }
     AnyDict meta;

@@ -2,14 +2,15 @@
 //
 // Opened by the clip's document (CONTENTS/CLIP/NAME.XML) or by the folder of a card that holds one clip; any
 // other XML document is refused without a line in the log for users. The picture and the sounds are MXF
-// files, which decoders for "mxf" read. The parts of a take that lies on several cards are joined, wherever
-// in it the document is: each part's sound begins with its picture, cut or with silence after it.
+// files, which decoders for "mxf" read; one that is shorter than its document says is "truncated". The parts
+// of a take that lies on several cards are joined, wherever in it the document is: each part's sound begins
+// with its picture, cut or with silence after it.
 //
 // Parameters: "filename" (text; after open by a folder the name of the document), "joinSpans" (Int32, 1: all
 // parts of a take, 0: the one of the document), "openParameters" (Dict, for the decoders of the essence).
 // Read only: "foreign" (Int32, 1: what did not open is no document of a clip), "clipName", "userClipName",
-// "startTimecode" (Strings, absent where the clip has none), "meta" (Dict of them), "inputFiles" (Vector, all
-// files), "filesize" (bytes of the essence).
+// "startTimecode" (Strings, absent where the clip has none), "meta" (Dict of them, and the same as "title"
+// and "timecode"), "inputFiles" (Vector, all files), "filesize" (bytes of the essence).
 #pragma once
 
 #include <memory>
@@ -18,6 +19,7 @@
 
 #include "builtin/decoders/p2/p2clip.h"
 #include "builtin/decoders/p2/p2stream.h"
+#include "builtin/shared/metainput.h"
 #include "core/decode/qvdecoder.h"
 
 class P2Dec : public QvDecodePipe {
@@ -53,10 +55,9 @@ class P2Dec : public QvDecodePipe {
     };
 
   private:
-    Any filename_;
+    MetaInput source_{false};
     Settings settings_;
     bool foreign_ = false;  // what the last open refused is no clip
-    AnyDict inputParams_;
     std::vector<P2Clip> take_;
     std::vector<std::unique_ptr<P2Stream>> streams_;  // the picture, then the sounds
 
@@ -64,7 +65,7 @@ class P2Dec : public QvDecodePipe {
     int noStream(const char* operation);
     int noted(int result, const P2Stream& stream);
     int refuse(const P2Fault& fault);
-    std::string openEssence(const Any& file, P2Stream& stream) const;
+    std::string openEssence(const Any& file, const P2Length& said, P2Stream& stream) const;
     std::string openStreams();
     void fillMeta(AnyDict& meta) const;
 };

@@ -39,7 +39,26 @@ std::string difference(const Common (&keys)[Count], const AnyDict& first, const 
 
 const char* P2Stream::lengthKey() const { return type_ == qvVideoStream ? "frames" : "samples"; }
 
-std::string P2Stream::append(std::unique_ptr<QvDecodePipe> decoder) {
+const char* P2Stream::expectedKey() const {
+    return type_ == qvVideoStream ? "framesExpected" : "samplesExpected";
+}
+
+// Marks a part that ends before the length that it is said to have. Sound may end within the last unit.
+void P2Stream::compare(Part& part, const P2Length& said) const {
+    if (part.params.get("truncated").isTrue()) return;  // its decoder knows
+    const bool video = type_ == qvVideoStream;
+    const QvRatio rate = video ? part.params.get("framerate").asFramerate().rate()
+                               : QvRatio(part.params.getInt32("samplerate"), 1);
+    const auto places = [&](long long units) {
+        return qvmath::mulDiv(units, said.num, rate.num, 1LL * said.den * rate.den);
+    };
+    const long long expected = places(said.count);
+    if (part.length + (video ? 0 : places(1)) >= expected) return;
+    part.params.set("truncated", Any(1));
+    part.params.set(expectedKey(), Any(expected));
+}
+
+std::string P2Stream::append(std::unique_ptr<QvDecodePipe> decoder, const P2Length& said) {
     const bool video = type_ == qvVideoStream;
     if (decoder->nrStreams(type_) == 0) return video ? "it has no picture" : "it has no sound";
     Part part;
@@ -59,6 +78,7 @@ std::string P2Stream::append(std::unique_ptr<QvDecodePipe> decoder) {
     }
     part.start = length();
     part.length = std::max<long long>(video ? decoder->nrFrames(0) : decoder->nrSamples(0), 0);
+    compare(part, said);
     part.decoder = std::move(decoder);
     parts_.push_back(std::move(part));
     return "";
@@ -90,19 +110,18 @@ long long P2Stream::bytes() const {
 void P2Stream::describe() {
     const bool video = type_ == qvVideoStream;
     params_ = parts_.front().params;
-    const char* expectedKey = video ? "framesExpected" : "samplesExpected";
     long long missing = 0;
     for (const Part& part : parts_) {
-        const Any& expected = part.params.get(expectedKey);
+        const Any& expected = part.params.get(expectedKey());
         const Any& own = part.params.get(lengthKey());
         if (part.params.get("truncated").isTrue() && expected.isInt() && own.isInt())
             missing += std::max(expected.toInt64() - own.toInt64(), 0LL);
     }
     params_.remove("truncated");
-    params_.remove(expectedKey);
+    params_.remove(expectedKey());
     if (missing > 0) {
         params_.set("truncated", Any(1));
-        params_.set(expectedKey, Any(length() + missing));
+        params_.set(expectedKey(), Any(length() + missing));
     }
     if (video) {
         params_.set("frames", Any(static_cast<int>(std::min<long long>(length(), 0x7fffffff))));

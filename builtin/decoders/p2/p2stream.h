@@ -5,6 +5,7 @@
 #include <string>
 #include <vector>
 
+#include "builtin/decoders/p2/p2clip.h"
 #include "core/decode/qvdecoder.h"
 #include "core/media/qvbuffer.h"
 #include "core/media/qvpcm.h"
@@ -14,8 +15,9 @@ class P2Stream {
   public:
     explicit P2Stream(int type) : type_(type) {}  // qvVideoStream or qvAudioStream
 
-    // Appends the first stream of this type of an open decoder. Why it can't follow; empty if it does.
-    std::string append(std::unique_ptr<QvDecodePipe> decoder);
+    // Appends the first stream of this type of an open decoder, which is `said` to be so long. Why it can't
+    // follow; empty if it does.
+    std::string append(std::unique_ptr<QvDecodePipe> decoder, const P2Length& said);
     // For a sound: each part but the last one is as long as its picture, whatever its file holds.
     void alignTo(const P2Stream& picture);
     // When all parts are there: fills params().
@@ -60,6 +62,8 @@ class P2Stream {
     std::string failure_;
 
     const char* lengthKey() const;
+    const char* expectedKey() const;
+    void compare(Part& part, const P2Length& said) const;
     int enterPart();
     int readPiece(int count, long long left);
     int fail(int code, const std::string& text);

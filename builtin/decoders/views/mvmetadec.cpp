@@ -76,20 +76,10 @@ MVMetaDec::~MVMetaDec() = default;
 
 int MVMetaDec::setParam(const char* name, const Any& value) {
     const auto is = [name](const char* other) { return std::strcmp(name, other) == 0; };
-    if (is("filename")) {
+    std::string fault;
+    if (const auto result = source_.set(name, value, fault)) {
         _traceParam(name, value);
-        if (!value.isText()) return setError(QvStatus::invalidStructure, "Invalid value type for 'filename'");
-        filename_ = value;
-        metaState_.clear();
-        return QvStatus::ok;
-    }
-    if (is("metaState")) {
-        _traceParam(name, value);
-        if (!value.isDict())
-            return setError(QvStatus::invalidStructure, "Invalid value type for 'metaState'");
-        metaState_ = value.asDict();
-        filename_.invalidate();
-        return QvStatus::ok;
+        return fault.empty() ? *result : setError(*result, "%s", fault.c_str());
     }
     if (is("layout")) {
         _traceParam(name, value);
@@ -100,16 +90,10 @@ int MVMetaDec::setParam(const char* name, const Any& value) {
         settings_.layout = text;
         return QvStatus::ok;
     }
-    if (is("openParameters")) {
-        _traceParam(name, value);
-        if (!value.isDict()) return QvStatus::invalidParam;
-        inputParams_ = value.asDict();
-        return QvStatus::ok;
-    }
     if (is("settings")) {  // of a stored state
         if (!value.isDict()) return QvStatus::invalidParam;
         const AnyDict& stored = value.asDict();
-        if (stored.get("openParameters").isDict()) inputParams_ = stored.get("openParameters").asDict();
+        if (stored.get("openParameters").isDict()) source_.openParams = stored.get("openParameters").asDict();
         return stored.isSet("layout") ? setParam("layout", stored.get("layout")) : QvStatus::ok;
     }
     return BaseDecodePipe::setParam(name, value);
@@ -118,23 +102,20 @@ int MVMetaDec::setParam(const char* name, const Any& value) {
 void MVMetaDec::getParam(const char* name, Any& value) const {
     const auto is = [name](const char* other) { return std::strcmp(name, other) == 0; };
     const MVStream* shown = picture();
-    if (is("filename")) {
-        value = filename_;
-    } else if (is("metaState")) {
-        value = metaState_;
-    } else if (is("layout")) {
+    if (source_.get(name, value)) return;
+    if (is("layout")) {
         value = settings_.layout.c_str();
     } else if (is("inputFailure")) {
         value = inputFailure_.c_str();
     } else if (is("isMeta")) {
-        value = !filename_.isValid() && !metaState_.empty() ? 1 : 0;
+        value = !source_.filename.isValid() && !source_.state.empty() ? 1 : 0;
     } else if (is("metaData")) {
         value = AnyVector();
         value.asVector().append(Any(elementName));
-        value.asVector().append(Any(metaState_));
+        value.asVector().append(Any(source_.state));
     } else if (is("store")) {
         AnyDict settings;
-        if (!inputParams_.empty()) settings.set("openParameters", inputParams_);
+        if (!source_.openParams.empty()) settings.set("openParameters", source_.openParams);
         if (!settings_.layout.empty()) settings.set("layout", settings_.layout.c_str());
         if (!settings.empty()) value = AnyDict("settings", settings);
     } else if (is("inputFiles")) {
@@ -167,9 +148,9 @@ int MVMetaDec::refuse(int code, const std::string& reason) {
 int MVMetaDec::readSetup(QvViewSetup& setup, bool& isNone) {
     isNone = false;
     const std::string fault =
-        filename_.isValid() ? setup.load(filename_, &isNone) : setup.restore(metaState_);
+        source_.filename.isValid() ? setup.load(source_.filename, &isNone) : setup.restore(source_.state);
     if (!fault.empty()) return refuse(QvStatus::failed, fault);
-    if (filename_.isValid()) setup.store(metaState_);
+    if (source_.filename.isValid()) setup.store(source_.state);
     if (!settings_.layout.empty()) QvViewSetup::findLayout(settings_.layout, setup.layout);
     return QvStatus::ok;
 }
@@ -177,9 +158,9 @@ int MVMetaDec::readSetup(QvViewSetup& setup, bool& isNone) {
 int MVMetaDec::open() {
     if (getState() == stateOpen) close();
     inputFailure_.clear();
-    if (!filename_.isValid() && metaState_.empty())
+    if (!source_.filename.isValid() && source_.state.empty())
         return refuse(QvStatus::illegalState, "open: open parameters not defined");
-    const InputNesting nesting(filename_);
+    const InputNesting nesting(source_.filename);
     const auto failed = [this](int code) {
         InputNesting::noteFailure(inputFailure_);
         return code;
@@ -190,9 +171,9 @@ int MVMetaDec::open() {
     if (const int result = readSetup(setup, isNone); result != QvStatus::ok)
         return isNone ? result : failed(result);
 
-    const Any params = inputParams_;
+    const Any params = source_.openParams;
     MVStream& stream = *addStream(std::make_unique<MVStream>());
-    if (const std::string fault = stream.prepare(setup, inputParams_.empty() ? nullptr : &params);
+    if (const std::string fault = stream.prepare(setup, source_.openParams.empty() ? nullptr : &params);
         !fault.empty())
         return failed(refuse(QvStatus::failed, fault));
     addSounds(stream);
@@ -246,7 +227,10 @@ int MVMetaDec::readSamples(int count, int stream) {
 }
 
 int MVMetaDec::seekToSample(long long sample, int stream) {
-    return soundInput("seekToSample", stream).seekToSample(sample, stream);
+    QvDecodePipe& input = soundInput("seekToSample", stream);
+    const int result = input.seekToSample(sample, stream);
+    if (result < 0 && result != QvStatus::endOfStream) setError(result, "%s", input.errorDesc());
+    return result;
 }
 
 QvPcm* MVMetaDec::getAudioPtr(int stream) { return soundInput("getAudioPtr", stream).getAudioPtr(stream); }

@@ -15,6 +15,7 @@
 
 #include <string>
 
+#include "builtin/shared/metainput.h"
 #include "core/compose/qvviewsetup.h"
 #include "core/decode/basedecodepipe.h"
 
@@ -42,10 +43,8 @@ class MVMetaDec : public BaseDecodePipe {
     };
 
   private:
-    Any filename_;
-    AnyDict metaState_;
+    MetaInput source_{true};
     Settings settings_;
-    AnyDict inputParams_;
     std::string inputFailure_;
 
     int refuse(int code, const std::string& reason);

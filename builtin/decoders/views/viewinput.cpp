@@ -105,7 +105,8 @@ int ViewInput::read() {
 
 int ViewInput::seek(long long frame) {
     const int result = decoder_->seekToFrame(frame, stream_);
-    return result == QvStatus::ok ? result : fail(result, "it can't be sought");
+    if (result == QvStatus::ok) return result;
+    return fail(result, *decoder_->errorDesc() ? decoder_->errorDesc() : "it can't be sought");
 }
 
 int ViewInput::linkable(std::vector<QvFrame*>& frames) {

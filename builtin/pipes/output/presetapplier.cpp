@@ -87,7 +87,8 @@ int PresetApplier::apply(const QvPreset& given, bool keepFilters, const char* mo
                           qvProfileToSym(preset.profile()), preset.profile());
     const auto former = StreamSnapshot::all(streams_, end_.muxer());
     builder_.removeAll(qvAllStreams);
-    const bool whole = preset.get("muxer").isDict() && preset.get("streams").isVector();
+    const Any& streams = preset.get("streams");  // a dictionary in an older form, see PipeState
+    const bool whole = preset.get("muxer").isDict() && (streams.isVector() || streams.isDict());
     if (whole) {
         if (const int result = restoreWhole(preset, module)) return result;
         if (keepFilters) giveFilters(former);

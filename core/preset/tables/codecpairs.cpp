@@ -44,8 +44,8 @@ constexpr CodecPairs pairs[] = {
 };
 // clang-format on
 
-constexpr int kBluray = 0x0203;
-constexpr int kXdcamEx = 0x020E;
+// Whether a profile is one of those from `first` to `last`, both included.
+constexpr bool isWithin(int profile, int first, int last) { return profile >= first && profile <= last; }
 
 }  // namespace
 
@@ -64,9 +64,10 @@ CodecCompat qvInstalledPairs(const InstalledModules& installed) {
 
 std::optional<bool> qvPairByProfile(const char* encoder, const char* muxer, int profile) {
     if (std::string_view(encoder) != "mpegpcmenc") return std::nullopt;
-    const int family = profileScheme::familyOf(profile);
+    using profileScheme::named;
     if (std::string_view(muxer) == "mptsmux")
-        return family == kBluray || profile == profileScheme::named("AVCHD");
-    if (std::string_view(muxer) == "mp4mux") return family == kXdcamEx;
+        return isWithin(profile, named("BD_H264_HDMV"), named("BD_VC1")) || profile == named("AVCHD");
+    if (std::string_view(muxer) == "mp4mux")
+        return isWithin(profile, named("XDCAM_EX_1920"), named("XDCAM_EX_1280"));
     return std::nullopt;
 }

@@ -34,9 +34,11 @@ class Events : public QvFileOpenCb {
     int fileOpenFinished(int result, QvFileOpenCbData& data) override {
         all.push_back(std::to_string(result) + " " + std::to_string(data.percent) + " " +
                       data.text.asString("-"));
+        reasons += data.reason.asString("-") + std::string(" ");
         return -1;
     }
     Texts all;
+    std::string reasons;  // of each finish
 };
 
 struct Factory : testing::Test {
@@ -68,6 +70,7 @@ TEST_F(Factory, TriesUntilOneOpens) {
     EXPECT_EQ(events.all,
               (Texts{"start first", "-1 0 Failed to open file 'some/A.FAKE' using 'first'.", "start second",
                      "0 100 Successfully opened file 'some/A.FAKE' with decoder 'second'."}));
+    EXPECT_EQ(events.reasons, "will not open - ") << "of the failure only";
     EXPECT_TRUE(log.contains("Failed to open file 'some/A.FAKE' using 'first'.", QvLogMask::error));
 }
 

@@ -193,6 +193,8 @@ TEST(Catalogue, PairsDependOnThePresetToo) {
         EXPECT_EQ(catalogue.isCompatible(c.codec, c.muxer, c.symbol ? numberOf(c.symbol) : -1), c.goes)
             << c.codec << " " << c.muxer << " " << (c.symbol ? c.symbol : "-");
     EXPECT_TRUE(catalogue.isCompatible("mpegpcmenc", "mptsmux")) << "the list alone";
+    for (const int past : {numberOf("BD_H264_HDMV") - 1, numberOf("BD_VC1") + 1})
+        EXPECT_FALSE(catalogue.isCompatible("mpegpcmenc", "mptsmux", past)) << "past the ends of Blu-ray";
     EXPECT_TRUE(catalogue.isCompatible("mpegvenc", "mp4mux", 0x2FFFFFF)) << "no such preset";
     EXPECT_FALSE(catalogue.isCompatible(nullptr, "mp4mux") || catalogue.isCompatible("mpegvenc", nullptr));
 

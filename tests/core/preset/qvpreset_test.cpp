@@ -75,6 +75,7 @@ TEST_F(Preset, InvalidOnesSayWhyAndStay) {
         {QvPreset(AnyDict("profile", "RAW")), "Uninitialized preset object?"},
         {QvPreset(qvSymToProfile("H264_HIGH"), "x"),
          "Base profile 'H264_HIGH' not available - missing plugins?"},
+        {QvPreset(13, "oldest"), "Base profile 'H264' not available - missing plugins?"},
         {QvPreset(QvProfile::firstOfPlugins, "x"),
          "Base profile '0x2800000' not available - missing plugins?"},
         {whole("muxer.name", "absentmux"), "mine - setMuxer: muxer 'absentmux' not available"},
@@ -131,6 +132,16 @@ TEST_F(Preset, InfoTellsWhatThePipeMakes) {
     EXPECT_EQ(lost.info(), "Format: amux; Audio: aaenc");
     EXPECT_NE(failureOf([] { QvPreset(nullptr, "x"); }), "no failure");
     EXPECT_NE(failureOf([&] { QvPreset(pipe.get(), nullptr); }), "no failure");
+}
+
+TEST_F(Preset, StreamsOfAnOlderFormKeepTheirSettings) {
+    QvPreset preset = whole("streams.0.codec.settingsDict.width", 320);
+    const AnyVector streams = preset.getVector("streams");
+    preset.set("streams", AnyDict("vids", AnyVector(streams.at(0)), "auds", AnyVector(streams.at(1))));
+    const std::unique_ptr<QvEncodePipe> pipe(QvEncodePipe::create());
+    ASSERT_EQ(pipe->applyPreset(preset, 0), 0) << pipe->errorDesc();
+    EXPECT_EQ(pipe->nrStreams(), 2);
+    EXPECT_EQ(pipe->videoEncoder(0)->getParam("width"), 320);
 }
 
 TEST_F(Preset, ToNoneReleasesItsProfileEverywhere) {

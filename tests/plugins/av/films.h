@@ -45,3 +45,14 @@ class Films : public testing::Test {
     static constexpr const char* kMoving = "testsrc2=size=96x64:rate=25:duration=2";
     TempFolder folder;
 };
+
+// With the tool, which loads the plug-in by itself.
+class FilmsInTheTool : public Films {
+  protected:
+    Outcome tarsel(Words words) const {
+        words.insert(words.begin(), QV_BINARY_DIR "/bin/tarsel");
+        ProcessOptions options;
+        options.folder = folder.path().string();
+        return runProgram(words, options);
+    }
+};

@@ -6,6 +6,7 @@
 
 namespace {
 
+using testing::AllOf;
 using testing::HasSubstr;
 
 class Views : public Tool {
@@ -87,7 +88,12 @@ TEST_F(Cards, AClipIsAnInputByItsFolder) {
     works(coded({"transcode", "card/CONTENTS/CLIP/A.XML", "-o", "out_%d.wav", "--no-video"}));
     EXPECT_GT(size("out_1.wav"), 19200);
     const auto json = nlohmann::json::parse(works(coded({"info", "card", "--json"})).out);
-    EXPECT_THAT(json.dump(), HasSubstr("p2dec"));
+    EXPECT_EQ(json[0]["decoder"], "p2dec");
+    EXPECT_EQ(json[0]["meta"]["clipName"], "A");
+    EXPECT_THAT(works(coded({"info", "card"})).out, AllOf(HasSubstr("Two geese"), HasSubstr("01:02:03:04")));
+    writeP2Clip(folder.path() / "short", {.name = "A", .samples = {}, .duration = 7});
+    fails(3, coded({"transcode", "short", "-o", "short.gray"}), {"5 of 7 frames"});
+    works(coded({"transcode", "short", "-o", "short.gray", "--accept-partial"}));
     fails(3, {"--no-plugins", "info", "card"}, {"there is no decoder for MXF files here"});
     fails(3, {"transcode", "card/CONTENTS/CLIP/A.XML", "-o", "x.wav"}, {"A.MXF"});
     writeP2Clip(folder.path() / "card", {.name = "B"});

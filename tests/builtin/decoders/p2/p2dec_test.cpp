@@ -15,6 +15,7 @@
 namespace {
 
 namespace fs = std::filesystem;
+using testing::AllOf;
 using testing::HasSubstr;
 
 class P2 : public testing::Test {
@@ -171,9 +172,35 @@ TEST_F(P2, WhatIsNoWholeClipIsRefused) {
     writeText(contents / "AUDIO/B01.MXF", "audio 10 0 44100");
     EXPECT_THAT(faultOf(document), HasSubstr("its sample rate is 44100, not 48000"));
     writeText(contents / "VIDEO/B.MXF", "damaged");
-    EXPECT_THAT(faultOf(document), HasSubstr("B.MXF': Failed to open file"));
+    EXPECT_THAT(faultOf(document),
+                AllOf(HasSubstr("B.MXF': Failed to open file"), HasSubstr("no such essence")));
     writeP2Clip(card, {.name = "C"});
     EXPECT_THAT(faultOf(card.string()), HasSubstr("2 clips: A.XML, C.XML; give one"));
+}
+
+// A copy of a card may lack the end of a file.
+TEST_F(P2, EssenceThatIsShorterThanTheDocumentSaysIsTruncated) {
+    const auto expected = [](P2Dec& decoder, int type, int stream, const char* key) {
+        const Any value = decoder.getStreamParam(type, stream, key);
+        return decoder.getStreamParam(type, stream, "truncated").isTrue() ? value.toInt64() : 0;
+    };
+    const std::vector<int> samples = {15360 - 1920, 15360 - 1921};
+    const std::string document =
+        writeP2Clip(folder.path(), {.name = "A", .frames = 5, .samples = samples, .duration = 8});
+    const auto decoder = open(document);
+    ASSERT_EQ(fault, "");
+    EXPECT_EQ(expected(*decoder, qvVideoStream, 0, "framesExpected"), 8);
+    EXPECT_EQ(expected(*decoder, qvAudioStream, 0, "samplesExpected"), 0) << "ends within the last frame";
+    EXPECT_EQ(expected(*decoder, qvAudioStream, 1, "samplesExpected"), 15360);
+    const std::string body = TempFolder::read(document);
+    for (const char* unit : {"1/0", "0/25", "25", "1/25x", "-1/25", ""}) {
+        std::string text = body;
+        text.replace(text.find("1/25"), 4, unit);
+        writeText(document, text);
+        EXPECT_EQ(expected(*open(document), qvVideoStream, 0, "framesExpected"), 0) << unit;
+    }
+    writeP2Clip(folder.path(), {.name = "A", .frames = 8, .samples = {15360}, .duration = 8});
+    EXPECT_EQ(expected(*open(document), qvVideoStream, 0, "framesExpected"), 0);
 }
 
 TEST_F(P2, ForeignDocumentsAreRefusedQuietly) {

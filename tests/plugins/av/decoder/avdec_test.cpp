@@ -8,16 +8,6 @@ namespace {
 using testing::HasSubstr;
 using testing::Not;
 
-class FilmsInTheTool : public Films {
-  protected:
-    Outcome tarsel(Words words) const {
-        words.insert(words.begin(), QV_BINARY_DIR "/bin/tarsel");
-        ProcessOptions options;
-        options.folder = folder.path().string();
-        return runProgram(words, options);
-    }
-};
-
 TEST_F(FilmsInTheTool, areShownAndTranscodedToTheirLastPicture) {
     const std::string file =
         film("film.mp4", {"-c:v", "mpeg4", "-g", "12", "-bf", "2", "-metadata:s:v", "language=deu"});
