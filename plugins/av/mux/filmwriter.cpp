@@ -86,6 +86,8 @@ bool FilmWriter::begin() {
     made->flush_packets = 0;
     made->io_open = openNothing;
     made->strict_std_compliance = FF_COMPLIANCE_UNOFFICIAL;
+    // Matroska shows from 0 on: what is before it is the priming that its header states.
+    if (job_.container->statesDelay) made->avoid_negative_ts = AVFMT_AVOID_NEG_TS_DISABLED;
     for (MuxTrack& track : tracks_)
         if (!addStream(track)) return failWith("a stream could not be made", AVERROR(ENOMEM));
     const std::string lost = setFilmWords(*made, *job_.container, job_.meta, seconds());

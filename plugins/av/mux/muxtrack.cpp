@@ -288,6 +288,9 @@ bool MuxTrack::learn(AVPacket& unit) {
 
 bool MuxTrack::take(PacketPtr unit, std::vector<PacketPtr>& out) {
     if (unit->pts == AV_NOPTS_VALUE) unit->pts = unit->dts = next_;
+    if (unit->pts < -std::int64_t{parameters_->initial_padding} || unit->pts > 1LL << 48 ||
+        unit->duration < 0)
+        return fail("a unit has the time " + std::to_string(unit->pts));
     next_ = std::max(next_, unit->pts + unit->duration);
     if (video_ || codec_->codec != MuxCodec::pcm || !container_->bigPcm) {
     } else if (av_packet_make_writable(unit.get()) >= 0) {
