@@ -77,12 +77,11 @@ int FileSink::open() {
     return QvStatus::ok;
 }
 
-// Asking for the whole buffer makes the file's record write what it holds; then the C library's goes too.
+// A multiplexer may have had the corrections made already, after which the record takes nothing more.
 int FileSink::writeOut() {
     std::lock_guard lock(stream_);
+    if (stream_.writeOut() != QvStatus::ok) return QvStatus::failed;
     auto* out = stream_.input();
-    const auto size = static_cast<unsigned>(settings_.bufsize);
-    if (out->usable(out) < size && !out->request(out, size)) return QvStatus::failed;
     out->auxinfo(out, 0, QvAuxId::FLUSH_BUFFER, nullptr, 0);
     return stream_.ioError() == 0 ? QvStatus::ok : QvStatus::failed;
 }

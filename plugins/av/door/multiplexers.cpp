@@ -1,0 +1,27 @@
+#include <sstream>
+#include <string>
+
+#include "core/engine/modules/qvmodule.h"
+#include "core/engine/modules/qvplugin.h"
+#include "core/value/any.h"
+#include "core/value/anycontainer.h"
+#include "plugins/av/door/avmodules.h"
+#include "plugins/av/door/containers.h"
+
+namespace av {
+
+void addMultiplexers(QvPlugin& plugin, const std::shared_ptr<CodecLibrary>& library) {
+    for (const MuxerModule& row : muxerModules) {
+        QvModule* const module =
+            newModule(library, QvModuleType::muxer, row.name, row.description, row.displayName);
+        AnyVector extensions;
+        std::istringstream words(row.extensions);
+        for (std::string word; words >> word;) extensions.append(Any(word.c_str()));
+        module->setAttr("exts", extensions);
+        module->setAttr("sizedStreams", 1);
+        if (row.transportStream) module->setAttr("transportStream", 1);
+        plugin.addModule(module);
+    }
+}
+
+}  // namespace av

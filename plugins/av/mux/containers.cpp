@@ -1,0 +1,134 @@
+#include "plugins/av/mux/containers.h"
+
+#include <cstring>
+#include <string_view>
+#include <vector>
+
+namespace av {
+
+namespace {
+
+using enum MuxCodec;
+using namespace FilmWord;
+
+// clang-format off
+constexpr auto codecRows = std::to_array<MuxCodecRow>({
+    {h264,     AV_CODEC_ID_H264,       "H.264",     "H264,AVC ,AVC1",           true},
+    {hevc,     AV_CODEC_ID_HEVC,       "H.265",     "HEVC,H265,HVC1",           true},
+    {av1,      AV_CODEC_ID_AV1,        "AV1",       "AV01,AV1 ",                true},
+    {vp8,      AV_CODEC_ID_VP8,        "VP8",       "VP80,VP8 ",                false},
+    {vp9,      AV_CODEC_ID_VP9,        "VP9",       "VP90,VP9 ",                false},
+    {mpeg1,    AV_CODEC_ID_MPEG1VIDEO, "MPEG-1",    "MPG1,MP1V,MPEG",           true},
+    {mpeg2,    AV_CODEC_ID_MPEG2VIDEO, "MPEG-2",    "MPG2,MP2V,M2V ",           true},
+    {mpeg4,    AV_CODEC_ID_MPEG4,      "MPEG-4",    "MP4V,FMP4,MPG4",           true},
+    {dnxhd,    AV_CODEC_ID_DNXHD,      "DNxHD",     "AVDN,VC3 ,VC-3,DNXH,AVDH", false},
+    {dv,       AV_CODEC_ID_DVVIDEO,    "DV",        "DV  ,DVSD,DV25,DV50,DVH1,DV1H,DVCP", false},
+    {jpeg2000, AV_CODEC_ID_JPEG2000,   "JPEG 2000", "MJ2K,MJP2,JP2K,J2K ,MJ2 ", false},
+    {prores,   AV_CODEC_ID_PRORES,     "ProRes",    "PRRS,PRES,APCN,APCH,APCS,APCO,AP4H,AP4X", false},
+    {ffv1,     AV_CODEC_ID_FFV1,       "FFV1",      "FFV1",                     false},
+    {mjpeg,    AV_CODEC_ID_MJPEG,      "JPEG",      "MJPG,JPEG",                false},
+    {raw,      AV_CODEC_ID_RAWVIDEO,   "raw pictures", "",                      false},
+    {aac,      AV_CODEC_ID_AAC,        "AAC",       "AAC ,MP4A",                true},
+    {mp2,      AV_CODEC_ID_MP2,        "MPEG audio", "MP2 ,MPA ,MPGA,MP1 ",     false},
+    {mp3,      AV_CODEC_ID_MP3,        "MP3",       "MP3 ,.MP3",                false},
+    {ac3,      AV_CODEC_ID_AC3,        "AC-3",      "AC-3,AC3 ",                false},
+    {eac3,     AV_CODEC_ID_EAC3,       "E-AC-3",    "EC-3,EAC3,E-AC",           false},
+    {flac,     AV_CODEC_ID_FLAC,       "FLAC",      "FLAC",                     false},
+    {opus,     AV_CODEC_ID_OPUS,       "Opus",      "OPUS",                     false},
+    {vorbis,   AV_CODEC_ID_VORBIS,     "Vorbis",    "VORB",                     false},
+    {pcm,      AV_CODEC_ID_PCM_S16LE,  "PCM",       "PCM ,LPCM",                false},
+});
+static_assert(codecRows.size() == static_cast<std::size_t>(MuxCodec::count));
+
+constexpr std::uint32_t everySound = codecBits(aac, mp2, mp3, ac3, eac3, flac, opus, vorbis, pcm);
+constexpr std::uint32_t everything = (1u << static_cast<int>(MuxCodec::count)) - 1;
+constexpr std::uint32_t mp4Codecs = codecBits(h264, hevc, av1, vp9, mpeg1, mpeg2, mpeg4, mjpeg, jpeg2000, aac, mp2, mp3, ac3, eac3, flac, opus, vorbis);
+constexpr std::uint32_t movCodecs = codecBits(h264, hevc, mpeg2, mpeg4, dnxhd, dv, jpeg2000, prores, mjpeg, raw, aac, mp3, ac3, eac3, pcm);
+
+// In the order of muxerModules.
+constexpr auto containers = std::to_array<Container>({
+    // format          codecs                                                   video sound pipe
+    //   words                                                   lengths adts   front  counted pixels bigPcm
+    {"mp4",          mp4Codecs,                                                  16, 32, PipeForm::fragments,
+         title | commonTags | chapters | timecode | language,    true,  false, true,  false,  true,  false},
+    {"mov",          movCodecs,                                                  16, 32, PipeForm::fragments,
+         title | commonTags | chapters | timecode | language,    true,  false, true,  false,  true,  false},
+    {"matroska",     everything,                                                 16, 64, PipeForm::live,
+         title | commonTags | allTags | chapters | timecode | language, true, false, false, false, false, false, true},
+    {"webm",         codecBits(vp8, vp9, av1, opus, vorbis),                     16, 32, PipeForm::live,
+         title | commonTags | allTags | chapters | language,     true,  false, false, false,  false, false, true},
+    {"mxf",          codecBits(mpeg1, mpeg2, h264, dnxhd, dv, jpeg2000, prores, ffv1, pcm), 1, 16, PipeForm::same,
+         title | timecode,                                       false, false, false, false,  true,  false},
+    {"mpegts",       codecBits(h264, hevc, mpeg1, mpeg2, mpeg4, jpeg2000, aac, mp2, mp3, ac3, eac3, opus), 8, 32, PipeForm::same,
+         title | language,                                       false, true,  false, false,  false, false},
+    {"mpeg",         codecBits(h264, mpeg1, mpeg2, mp2, mp3, ac3, pcm),          8, 16, PipeForm::same,
+         0,                                                      false, true,  false, false,  false, true},
+    {"dv",           codecBits(dv, pcm),                                         1, 4,  PipeForm::same,
+         timecode,                                               false, false, false, true,   false, false},
+    {"avi",          codecBits(dv, h264, mpeg1, mpeg2, mpeg4, mjpeg, ffv1, raw, mp2, mp3, ac3, pcm), 8, 32, PipeForm::none,
+         title | commonTags | language,                          false, true,  false, true,   false, false},
+    {"yuv4mpegpipe", codecBits(raw),                                             1, 0,  PipeForm::same,
+         0,                                                      false, false, false, true,   true,  false},
+    {"flac",         codecBits(flac),                                            0, 1,  PipeForm::same,
+         title | commonTags | allTags,                           false, false, false, true,   false, false},
+    {"ogg",          codecBits(flac, opus, vorbis, vp8),                         1, 8,  PipeForm::same,
+         title | commonTags | allTags | chapters,                false, false, false, false,  false, false},
+});
+static_assert(containers.size() == muxerModules.size());
+
+// Formats that an extension asks for, where they are not the container's own.
+constexpr struct {
+    const char *module, *extension, *container, *format;
+} formats[] = {
+    {"mp4mux",    "mov", "movmux",    "mov"},
+    {"mp4mux",    "m4a", "mp4mux",    "ipod"},
+    {"mp4mux",    "3gp", "mp4mux",    "3gp"},
+    {"mpegpsmux", "vob", "mpegpsmux", "vob"},
+};
+// clang-format on
+
+char upper(char c) { return c >= 'a' && c <= 'z' ? static_cast<char>(c - 'a' + 'A') : c; }
+
+}  // namespace
+
+const MuxCodecRow* muxCodec(std::uint32_t fourcc) {
+    char text[5] = {};
+    for (int i = 0; i < 4; ++i) text[i] = upper(static_cast<char>(fourcc >> 8 * i & 255));
+    for (const MuxCodecRow& row : codecRows) {
+        const std::string_view names = row.fourccs;
+        for (std::size_t at = 0; at + 4 <= names.size(); at += 5)
+            if (names.substr(at, 4) == std::string_view(text, 4)) return &row;
+    }
+    return nullptr;
+}
+
+const MuxCodecRow& muxCodecRow(MuxCodec codec) { return codecRows[static_cast<std::size_t>(codec)]; }
+
+const MuxerModule& Container::module() const {
+    return muxerModules[static_cast<std::size_t>(this - containers.data())];
+}
+
+std::string Container::takenNames(bool video) const {
+    std::vector<std::string> names;
+    for (const MuxCodecRow& row : codecRows)
+        if (takes(row.codec) && ((everySound & codecBit(row.codec)) == 0) == video) names.push_back(row.name);
+    std::string all;
+    for (std::size_t i = 0; i < names.size(); ++i)
+        all += (i == 0 ? "" : i + 1 == names.size() ? " and " : ", ") + names[i];
+    return all;
+}
+
+const Container* containerOf(const char* module) {
+    for (std::size_t i = 0; i < muxerModules.size(); ++i)
+        if (std::strcmp(muxerModules[i].name, module) == 0) return &containers[i];
+    return nullptr;
+}
+
+ContainerForm formFor(const Container& container, const std::string& extension) {
+    for (const auto& row : formats)
+        if (std::strcmp(row.module, container.module().name) == 0 && extension == row.extension)
+            return {containerOf(row.container), row.format};
+    return {&container, container.format};
+}
+
+}  // namespace av

@@ -1,0 +1,44 @@
+#include "plugins/av/mux/filmcheck.h"
+
+#include <cstring>
+
+#include "plugins/av/source/avheaders.h"
+#include "plugins/av/source/mediainput.h"
+
+namespace av {
+
+namespace {
+
+// Containers whose table of samples has every unit.
+bool countsUnits(const AVFormatContext& film) { return std::strstr(film.iformat->name, "mp4") != nullptr; }
+
+}  // namespace
+
+std::string checkFilm(const Any& file, const char* format, const std::vector<FilmExpectation>& streams) {
+    std::string reason;
+    const MediaBytes bytes(file);
+    const bool sound = std::strcmp(format, "flac") == 0;
+    const auto film = MediaInput::open(bytes, sound ? format : "", reason);
+    if (!film) return reason;
+    const AVFormatContext& context = film->context();
+    for (const bool video : {true, false}) {
+        unsigned at = 0;
+        for (const FilmExpectation& expected : streams) {
+            if (expected.video != video) continue;
+            const AVMediaType type = video ? AVMEDIA_TYPE_VIDEO : AVMEDIA_TYPE_AUDIO;
+            while (at < context.nb_streams && context.streams[at]->codecpar->codec_type != type) ++at;
+            if (at == context.nb_streams)
+                return expected.units == 0
+                           ? ""
+                           : std::string("a stream of ") + (video ? "pictures" : "sound") + " is missing";
+            const long long found = context.streams[at++]->nb_frames;
+            // Sound of one size a sample is counted in samples.
+            if (video && countsUnits(context) && found > 0 && found != expected.units)
+                return "it has " + std::to_string(found) + " of " + std::to_string(expected.units) +
+                       " pictures";
+        }
+    }
+    return "";
+}
+
+}  // namespace av

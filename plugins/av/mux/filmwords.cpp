@@ -1,0 +1,126 @@
+#include "plugins/av/mux/filmwords.h"
+
+#include <algorithm>
+#include <cmath>
+#include <cstring>
+#include <vector>
+
+#include "core/measure/mediatime.h"
+
+namespace av {
+
+namespace {
+
+// Keys of "meta" that have a tag of another name, or one that every kind of tags knows.
+constexpr struct {
+    const char *key, *tag;
+} common[] = {
+    {"title", "title"},
+    {"artist", "artist"},
+    {"album", "album"},
+    {"albumArtist", "album_artist"},
+    {"album_artist", "album_artist"},
+    {"composer", "composer"},
+    {"genre", "genre"},
+    {"date", "date"},
+    {"comment", "comment"},
+    {"copyright", "copyright"},
+    {"description", "description"},
+    {"track", "track"},
+};
+// Names that describe the source and not the film.
+constexpr const char* ofSource[] = {"clipName", "userClipName", "startTimecode", "codec", "language"};
+
+std::string textOf(const Any& value) {
+    const Any text = value.toString();
+    return text.isString() ? text.asString() : "";
+}
+
+double secondsOf(const Any& value) {
+    if (value.isMediaTime()) return value.asMediaTime().seconds();
+    return value.isInt() || value.isFloat() ? value.toDouble() : -1;
+}
+
+// A chapter ends where the next one begins.
+bool setChapters(AVFormatContext& film, const AnyVector& chapters, double seconds) {
+    constexpr AVRational milliseconds{1, 1000};
+    std::vector<std::pair<std::int64_t, std::string>> starts;
+    for (const Any& entry : chapters) {
+        if (!entry.isDict()) return false;
+        const double time = secondsOf(entry.asDict().get("time"));
+        if (!(time >= 0) || time > 1e9) return false;
+        starts.emplace_back(std::llround(time * 1000), textOf(entry.asDict().get("title")));
+    }
+    std::sort(starts.begin(), starts.end());
+    auto** const list = static_cast<AVChapter**>(av_calloc(starts.size(), sizeof(AVChapter*)));
+    if (!list) return starts.empty();
+    film.chapters = list;
+    for (std::size_t i = 0; i < starts.size(); ++i) {
+        auto* const chapter = static_cast<AVChapter*>(av_mallocz(sizeof(AVChapter)));
+        if (!chapter) return false;
+        list[film.nb_chapters++] = chapter;
+        chapter->id = static_cast<std::int64_t>(i) + 1;
+        chapter->time_base = milliseconds;
+        chapter->start = starts[i].first;
+        chapter->end = i + 1 < starts.size()
+                           ? starts[i + 1].first
+                           : std::max<std::int64_t>(std::llround(seconds * 1000), chapter->start);
+        if (!starts[i].second.empty()) av_dict_set(&chapter->metadata, "title", starts[i].second.c_str(), 0);
+    }
+    return true;
+}
+
+void setTimecode(AVFormatContext& film, const std::string& timecode) {
+    av_dict_set(&film.metadata, "timecode", timecode.c_str(), 0);
+    for (unsigned i = 0; i < film.nb_streams; ++i)
+        if (film.streams[i]->codecpar->codec_type == AVMEDIA_TYPE_VIDEO) {
+            av_dict_set(&film.streams[i]->metadata, "timecode", timecode.c_str(), 0);
+            break;
+        }
+}
+
+void setTag(AVFormatContext& film, const Container& container, const char* tag, const std::string& text) {
+    const bool title = std::strcmp(tag, "title") == 0;
+    const std::string format = container.format;
+    const char* const own = !title               ? tag
+                            : format == "mpegts" ? "service_name"
+                            : format == "mxf"    ? "material_package_name"
+                                                 : tag;
+    av_dict_set(&film.metadata, own, text.c_str(), 0);
+}
+
+}  // namespace
+
+std::string setFilmWords(AVFormatContext& film, const Container& container, const AnyDict& meta,
+                         double seconds) {
+    std::string lost;
+    const auto lose = [&lost](const char* name) { lost += (lost.empty() ? "" : ", ") + std::string(name); };
+    const auto holds = [&container](unsigned word) { return (container.words & word) != 0; };
+    for (const auto [key, value] : meta) {
+        const auto is = [name = key](const char* other) { return std::strcmp(name, other) == 0; };
+        if (std::any_of(std::begin(ofSource), std::end(ofSource), is)) continue;
+        if (is("chapters")) {
+            if (!value->isVector() || value->asVector().empty()) continue;
+            if (!holds(FilmWord::chapters) || !setChapters(film, value->asVector(), seconds)) lose(key);
+            continue;
+        }
+        const std::string text = textOf(*value);
+        if (text.empty() || is("timecode")) continue;
+        const auto row = std::find_if(std::begin(common), std::end(common),
+                                      [&is](const auto& entry) { return is(entry.key); });
+        const bool known = row != std::end(common);
+        const bool held = is("title") ? holds(FilmWord::title)
+                                      : holds(FilmWord::allTags) || (known && holds(FilmWord::commonTags));
+        if (held)
+            setTag(film, container, known ? row->tag : key, text);
+        else
+            lose(key);
+    }
+    std::string timecode = textOf(meta.get("timecode"));
+    if (timecode.empty()) timecode = textOf(meta.get("startTimecode"));
+    if (!timecode.empty() && holds(FilmWord::timecode)) setTimecode(film, timecode);
+    if (!timecode.empty() && !holds(FilmWord::timecode)) lose("timecode");
+    return lost;
+}
+
+}  // namespace av

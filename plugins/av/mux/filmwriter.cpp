@@ -1,0 +1,204 @@
+#include "plugins/av/mux/filmwriter.h"
+
+#include <algorithm>
+#include <climits>
+#include <cstring>
+#include <utility>
+
+#include "core/engine/log/qvlog.h"
+#include "plugins/av/mux/filmwords.h"
+#include "plugins/av/mux/muxoptions.h"
+
+namespace av {
+
+namespace {
+
+int openNothing(AVFormatContext*, AVIOContext**, const char*, int, AVDictionary**) { return AVERROR(EPERM); }
+
+}  // namespace
+
+FilmWriter::FilmWriter(QvBufStream& output, FilmJob job, std::vector<MuxTrack> tracks)
+    : job_(std::move(job)),
+      bytes_(output, job_.seekable),
+      tracks_(std::move(tracks)),
+      written_(tracks_.size(), 0) {
+    if (!bytes_.io()) fail("There is no memory for the output");
+}
+
+FilmWriter::~FilmWriter() = default;
+
+bool FilmWriter::fail(const std::string& problem) {
+    if (problem_.empty()) problem_ = problem.empty() ? "Multiplexing failed" : problem;
+    return false;
+}
+
+bool FilmWriter::failWith(const char* what, int code) {
+    if (bytes_.failed()) return fail(bytes_.problem());
+    return fail(std::string(job_.container->module().displayName) + ": " + what + ": " + errorText(code));
+}
+
+bool FilmWriter::unit(std::size_t track, PacketPtr unit) {
+    const std::lock_guard lock(lock_);
+    if (failed()) return false;
+    if (!tracks_[track].described())
+        return fail(tracks_[track].place() + ": its encoder sends units, but has not described them");
+    if (!tracks_[track].take(std::move(unit), made_)) return fail(tracks_[track].problem());
+    return beginIfReady() && putMade(track);
+}
+
+bool FilmWriter::putMade(std::size_t track) {
+    bool ok = true;
+    for (PacketPtr& unit : made_) {
+        if (!begun_)
+            waiting_.push_back({track, std::move(unit)});
+        else
+            ok = ok && put(track, *unit);
+    }
+    made_.clear();
+    return ok;
+}
+
+bool FilmWriter::put(std::size_t track, AVPacket& unit) {
+    const MuxTrack& from = tracks_[track];
+    av_packet_rescale_ts(&unit, from.timeBase(), from.stream->time_base);
+    unit.stream_index = from.stream->index;
+    if (unit.size > 0) ++written_[track];
+    const int result = av_interleaved_write_frame(film_.get(), &unit);
+    return result >= 0 || failWith("a unit could not be written", result);
+}
+
+// --- The header.
+
+bool FilmWriter::beginIfReady() {
+    if (begun_) return true;
+    const bool ready =
+        std::all_of(tracks_.begin(), tracks_.end(), [](const MuxTrack& track) { return track.ready(); });
+    return !ready || begin();
+}
+
+bool FilmWriter::begin() {
+    AVFormatContext* made = nullptr;
+    int result = avformat_alloc_output_context2(&made, nullptr, job_.format, nullptr);
+    film_.reset(made);
+    if (result < 0) return failWith("the libraries do not have it", result);
+    made->pb = bytes_.io();
+    made->flags |= AVFMT_FLAG_CUSTOM_IO;
+    made->flush_packets = 0;
+    made->io_open = openNothing;
+    made->strict_std_compliance = FF_COMPLIANCE_UNOFFICIAL;
+    // Matroska shows from 0 on: what is before it is the priming that its header states.
+    if (job_.container->statesDelay) made->avoid_negative_ts = AVFMT_AVOID_NEG_TS_DISABLED;
+    for (MuxTrack& track : tracks_)
+        if (!addStream(track)) return failWith("a stream could not be made", AVERROR(ENOMEM));
+    const std::string lost = setFilmWords(*made, *job_.container, job_.meta, seconds());
+    if (!lost.empty()) qv_log()->warning("'%s' does not hold: %s", job_.name.c_str(), lost.c_str());
+    AVDictionary* options = nullptr;
+    setOptions(&options);
+    result = avformat_write_header(made, &options);
+    av_dict_free(&options);
+    if (result < 0) return failWith("it can't be begun with these streams", result);
+    begun_ = true;
+    bool ok = true;
+    for (Waiting& first : waiting_) ok = ok && put(first.track, *first.unit);
+    waiting_.clear();
+    waiting_.shrink_to_fit();
+    return ok;
+}
+
+bool FilmWriter::addStream(MuxTrack& track) {
+    AVStream* const stream = avformat_new_stream(film_.get(), nullptr);
+    if (!stream || avcodec_parameters_copy(stream->codecpar, &track.parameters()) < 0) return false;
+    track.stream = stream;
+    stream->time_base = track.timeBase();
+    if (track.video()) {
+        stream->avg_frame_rate = stream->r_frame_rate = track.rate();
+        stream->sample_aspect_ratio = track.aspect();
+    }
+    const bool first = std::find_if(tracks_.begin(), tracks_.end(), [&track](const MuxTrack& other) {
+                           return other.video() == track.video();
+                       })->place() == track.place();
+    if (first) stream->disposition |= AV_DISPOSITION_DEFAULT;
+    if (!track.language.empty() && (job_.container->words & FilmWord::language))
+        av_dict_set(&stream->metadata, "language", track.language.c_str(), 0);
+    if (!track.title.empty() && (job_.container->words & FilmWord::commonTags))
+        av_dict_set(&stream->metadata, "title", track.title.c_str(), 0);
+    return true;
+}
+
+double FilmWriter::seconds() const {
+    for (const MuxTrack& track : tracks_)
+        if (track.video()) return job_.frames * av_q2d(track.timeBase());
+    return 0;
+}
+
+// The index of MP4: per unit its length, of video also its times; per chunk, which is a run of units of one
+// stream, its place and its count.
+long long FilmWriter::indexBytes() const {
+    constexpr long long head = 16384, picture = 4 + 8 + 4, sound = 4, chunk = 8 + 12;
+    long long bytes = head;
+    for (const MuxTrack& track : tracks_) {
+        const AVCodecParameters& is = track.parameters();
+        const double samples = seconds() * is.sample_rate;
+        const auto units = track.video()
+                               ? static_cast<long long>(job_.frames)
+                               : static_cast<long long>(samples / std::max(is.frame_size, 1024)) + 64;
+        bytes += 1024 + units * (track.video() ? picture : sound) +
+                 std::min<long long>(units, job_.frames + 1) * chunk;
+    }
+    return bytes;
+}
+
+void FilmWriter::setOptions(AVDictionary** options) {
+    const Container& container = *job_.container;
+    if (container.indexInFront) {
+        const bool pipe = !job_.seekable;
+        av_dict_set(options, "movflags",
+                    pipe ? "+write_colr+frag_keyframe+delay_moov+default_base_moof" : "+write_colr", 0);
+        if (pipe) {
+            av_dict_set(options, "min_frag_duration", "1000000", 0);
+            av_dict_set(options, "frag_duration", "10000000", 0);
+        } else if (job_.fastStart && job_.frames > 0 && indexBytes() < INT_MAX) {
+            av_dict_set_int(options, "moov_size", indexBytes(), 0);
+            spaceKept_ = true;
+        }
+        if (av_dict_get(film_->metadata, "timecode", nullptr, 0)) av_dict_set(options, "write_tmcd", "1", 0);
+    }
+    if (!job_.seekable && container.pipe == PipeForm::live) av_dict_set(options, "live", "1", 0);
+    if (job_.extension == "m2ts" || job_.extension == "mts") av_dict_set(options, "mpegts_m2ts_mode", "1", 0);
+    AVDictionary* own = nullptr;
+    parseMuxOptions(job_.options, job_.format, &own);
+    const AVDictionaryEntry* entry = nullptr;
+    while ((entry = av_dict_get(own, "", entry, AV_DICT_IGNORE_SUFFIX)))
+        av_dict_set(options, entry->key, entry->value, *entry->value == '+' ? AV_DICT_APPEND : 0);
+    av_dict_free(&own);
+}
+
+// --- The end.
+
+bool FilmWriter::close() {
+    const std::lock_guard lock(lock_);
+    if (failed()) return false;
+    for (std::size_t i = 0; i < tracks_.size(); ++i) {
+        if (!tracks_[i].finish(made_)) return fail(tracks_[i].problem());
+        if (!putMade(i)) return false;
+    }
+    if (!begun_) {
+        for (const MuxTrack& track : tracks_)
+            if (!track.ready())
+                return fail(track.place() + (track.described() ? ": there is nothing in it"
+                                                               : ": its encoder has not described it"));
+        if (!begin()) return false;
+    }
+    int result = av_write_trailer(film_.get());
+    avio_flush(bytes_.io());
+    if (result < 0 && !bytes_.failed() && spaceKept_ && bytes_.moveFromGap()) {
+        qv_dbg()->info("The index of '%s' does not fit into the space kept for it and is at the end",
+                       job_.name.c_str());
+        result = 0;
+    }
+    if (result >= 0) result = std::min(bytes_.io()->error, 0);
+    if (result < 0 || bytes_.failed()) return failWith("it could not be finished", result);
+    return bytes_.finish() || fail(bytes_.problem());
+}
+
+}  // namespace av

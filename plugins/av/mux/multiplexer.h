@@ -1,0 +1,80 @@
+// The multiplexers of the plug-in: films of one container, written through the output that is attached.
+#pragma once
+
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "core/encode/basemuxer.h"
+#include "plugins/av/mux/containers.h"
+
+namespace av {
+
+class FilmWriter;
+
+// Streams come from encoders as plugins/wire.h says, and from the engine's encoders of raw data. A run that
+// is aborted leaves a file without index.
+//
+// Parameters:
+//   "seekable"   -1 to 1, -1  1: headers are corrected when the film is complete, so the output has to take
+//                             BUF_SEEK_INFO; 0: what is written stays, as in a pipe; -1: 1 for a file
+//   "fastStart"  1            MP4: the index is at the front, if the number of frames is known before
+//   "avOptions"  ""           options of the libraries' container, "name=value:name=value"
+//   "language"   ""           of all streams of sound that have none, ISO 639-2
+//   "meta"       Dict         see setFilmWords
+//
+// addStream takes "language" and "title" of a stream, too, and so does setStreamParam.
+class Multiplexer : public BaseMuxer {
+  public:
+    struct Settings {
+        int seekable = -1;
+        bool fastStart = true;
+        int totalFrames = 0;
+        std::string avOptions, language;
+        Any filename;
+        AnyDict meta;
+    };
+
+    explicit Multiplexer(const Container& container);
+    ~Multiplexer() override;
+
+    const Container& container() const { return container_; }
+
+    int setParam(const char* name, const Any& value) override;
+    void getParam(const char* name, Any& value) const override;
+    using QvCodec::getParam;
+    void store(AnyDict& state) const override;
+    int restore(const AnyDict& state) override;
+    // `stream` counts all streams, pictures first. "language" and "title".
+    int setStreamParam(int program, int stream, const char* name, const Any& value) override;
+    void getStreamParams(int program, int stream, AnyDict& params) const override;
+
+    // Null beyond the streams that the container holds.
+    QvBufStream* addStream(int type, const AnyDict& params) override;
+    // QvStatus::failed for raw data that the container does not hold. What encoders describe is judged when
+    // they do.
+    int open() override;
+    int close() override;
+    int abort() override;
+    int muxElementaryStreams(QvFileMuxConfig& config, QvBufStream& output) override;
+
+  private:
+    const Container& container_;
+    Settings settings_;
+    std::unique_ptr<FilmWriter> film_;
+    bool file_ = false;  // the output is one whose contents can be read again
+
+    std::string extension() const;
+    bool regularFile() const;
+    int checkOptions(const Any& value);
+    int fail();
+    int describe(int type, int nr, const Container& container, std::vector<class MuxTrack>& tracks);
+    int check();
+    void end();
+    QvBufStream* streamAt(int index) const;
+};
+
+// A new multiplexer, owned by the caller; null for a module that is none.
+QvCodec* newMultiplexer(const char* module);
+
+}  // namespace av

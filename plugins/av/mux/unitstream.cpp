@@ -1,0 +1,227 @@
+#include "plugins/av/mux/unitstream.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <climits>
+#include <cstring>
+
+#include "core/engine/files/qvfileutil.h"
+#include "core/engine/status.h"
+#include "core/stream/auxinfoid.h"
+#include "core/stream/buf_impl_base.h"
+#include "core/stream/iofailure.h"
+#include "plugins/av/mux/filmwriter.h"
+#include "plugins/av/source/limits.h"
+
+namespace av {
+
+namespace {
+
+constexpr unsigned firstBytes = 4096;
+constexpr unsigned chunkBytes = 1 << 20;
+constexpr unsigned mostBytes = limits::allocation - chunkBytes;
+constexpr int soundBlocks = 25;  // of raw sound a second
+
+struct FreeBuffer {
+    void operator()(AVBufferRef* buffer) const { av_buffer_unref(&buffer); }
+};
+
+// A record of a size that the writer had; what is missing is 0.
+template <class T>
+bool read(T& to, const void* info, unsigned size) {
+    if (!info || size < sizeof(std::uint32_t)) return false;
+    std::memcpy(&to, info, std::min<std::size_t>(size, sizeof to));
+    return true;
+}
+
+}  // namespace
+
+class UnitStream::Record final : public Bufstream {
+  public:
+    Record(UnitStream& stream, FilmWriter& film, std::size_t track)
+        : stream_(stream), film_(film), track_(track), raw_(film.track(track).raw()) {
+        init();
+        const MuxTrack& is = film.track(track);
+        if (raw_ && !is.video()) {
+            sample_ = static_cast<unsigned>(is.sampleBytes());
+            block_ = static_cast<unsigned>(std::max(is.parameters().sample_rate / soundBlocks, 1)) * sample_;
+        }
+    }
+
+    unsigned usable() override { return mostBytes - filled_; }
+    unsigned chunksize() override { return chunkBytes; }
+    unsigned char* request(unsigned n) override {
+        if (film_.failed() || n > usable() || !reserve(n)) return nullptr;
+        return buffer_->data + filled_;
+    }
+    unsigned confirm(unsigned n) override {
+        n = buffer_ ? std::min(n, capacity_ - filled_) : 0;
+        filled_ += n;
+        return sample_ == 0 || filled_ < block_ || putSound() ? n : 0;
+    }
+    unsigned copybytes(unsigned char* p, unsigned n) override {
+        unsigned char* const to = request(n);
+        if (!to) {
+            noteFailure();
+            return 0;
+        }
+        std::memcpy(to, p, n);
+        return confirm(n);
+    }
+    unsigned auxinfo(unsigned, unsigned id, void* info, unsigned size) override {
+        bool ok = true;
+        switch (id) {
+            case QvAuxId::VIDEO_STREAM_INFO: ok = head<QvWire::VideoHead>(info, size); break;
+            case QvAuxId::AUDIO_STREAM_INFO: ok = head<QvWire::AudioHead>(info, size); break;
+            case QvAuxId::VIDEO_AU_CODE: ok = videoUnit(info, size); break;
+            case QvAuxId::AUDIO_AU_CODE: ok = audioUnit(info, size); break;
+            default: return 0;
+        }
+        if (!ok) noteFailure();
+        return ok ? 0 : BUFSTREAM_FAILED;
+    }
+    unsigned split() override { return BUFSTREAM_FAILED; }
+    void done(int) override {}
+    void free() override {}
+
+    bool finish() {
+        if (sample_ > 0) return putSound() && filled_ == 0;
+        return filled_ == 0;
+    }
+
+  private:
+    UnitStream& stream_;
+    FilmWriter& film_;
+    std::size_t track_;
+    bool raw_;
+    unsigned sample_ = 0;  // bytes of raw sound, all channels; 0 for all other streams
+    unsigned block_ = 0;   // of it
+    std::unique_ptr<AVBufferRef, FreeBuffer> buffer_;
+    unsigned filled_ = 0, capacity_ = 0, lastUnit_ = 0;
+
+    bool isVideo() const { return film_.track(track_).video(); }
+
+    bool reserve(unsigned n) {
+        const unsigned needed = filled_ + n;
+        if (buffer_ && needed <= capacity_) return true;
+        const unsigned room = std::max({needed, firstBytes, std::min(filled_ * 2, mostBytes), lastUnit_});
+        AVBufferRef* buffer = buffer_.release();
+        const bool ok = av_buffer_realloc(&buffer, room + AV_INPUT_BUFFER_PADDING_SIZE) >= 0;
+        buffer_.reset(buffer);
+        if (ok) capacity_ = room;
+        return ok || film_.fail("There is no memory for a unit");
+    }
+
+    // The first of the gathered bytes as a packet; the rest stays.
+    PacketPtr cut(unsigned bytes) {
+        PacketPtr unit(av_packet_alloc());
+        if (!unit || (bytes > 0 && !buffer_)) return nullptr;
+        const unsigned rest = filled_ - bytes;
+        std::unique_ptr<AVBufferRef, FreeBuffer> old = std::move(buffer_);
+        filled_ = 0;
+        capacity_ = 0;
+        if (rest > 0) {
+            if (!reserve(rest)) return nullptr;
+            std::memcpy(buffer_->data, old->data + bytes, rest);
+            filled_ = rest;
+        }
+        if (old) {
+            std::memset(old->data + bytes, 0, AV_INPUT_BUFFER_PADDING_SIZE);
+            unit->data = old->data;
+            unit->buf = old.release();
+        }
+        unit->size = static_cast<int>(bytes);
+        lastUnit_ = bytes;
+        return unit;
+    }
+
+    bool put(unsigned bytes, std::int64_t pts, std::int64_t dts, std::int64_t duration, bool key) {
+        if (bytes != filled_ && sample_ == 0)
+            return film_.fail(film_.track(track_).place() + ": a unit of " + std::to_string(bytes) +
+                              " bytes was announced, and " + std::to_string(filled_) + " bytes had come");
+        PacketPtr unit = cut(bytes);
+        if (!unit) return film_.fail("There is no memory for a unit");
+        unit->pts = pts;
+        unit->dts = dts;
+        unit->duration = duration;
+        if (key) unit->flags |= AV_PKT_FLAG_KEY;
+        return film_.unit(track_, std::move(unit));
+    }
+
+    bool putSound() {
+        const unsigned samples = filled_ / sample_;
+        if (samples == 0) return true;
+        if (put(samples * sample_, AV_NOPTS_VALUE, AV_NOPTS_VALUE, samples, true)) return true;
+        noteFailure();
+        return false;
+    }
+
+    template <class Head>
+    bool head(const void* info, unsigned size) {
+        Head head{};
+        constexpr bool video = std::is_same_v<Head, QvWire::VideoHead>;
+        if (raw_ || video != isVideo() || !read(head, info, size))
+            return film_.fail(film_.track(track_).place() + ": its head is none of this kind of stream");
+        if (head.version != QvWire::version)
+            return film_.fail(film_.track(track_).place() + ": its head has the version " +
+                              std::to_string(head.version) + ", known is " + std::to_string(QvWire::version));
+        return film_.head(track_, head);
+    }
+
+    bool videoUnit(const void* info, unsigned size) {
+        QvWire::VideoUnit unit{};
+        if (!isVideo() || !read(unit, info, size)) return film_.fail("A unit of video has no record");
+        if (raw_) return picture();
+        const bool timed = (unit.flags & QvWire::unitTimed) != 0;
+        return put(unit.bytes, timed ? unit.pts : AV_NOPTS_VALUE, timed ? unit.dts : AV_NOPTS_VALUE,
+                   std::max<std::int64_t>(unit.duration, 1), (unit.flags & QvWire::unitKey) != 0);
+    }
+
+    // The count of a raw picture may be that of the frame before it was packed.
+    bool picture() {
+        if (filled_ != film_.track(track_).pictureBytes())
+            return film_.fail(film_.track(track_).place() + ": a picture has " + std::to_string(filled_) +
+                              " bytes, not " + std::to_string(film_.track(track_).pictureBytes()));
+        return put(filled_, AV_NOPTS_VALUE, AV_NOPTS_VALUE, 1, true);
+    }
+
+    bool audioUnit(const void* info, unsigned size) {
+        QvWire::AudioUnit unit{};
+        if (isVideo() || !read(unit, info, size)) return film_.fail("A unit of sound has no record");
+        if (raw_) return putSound();
+        const std::int64_t time = unit.timed() ? unit.pts : AV_NOPTS_VALUE;
+        const std::uint32_t samples = unit.sampleCount();
+        const int usual = film_.track(track_).frameSize();
+        return put(unit.bytes, time, time, samples > 0 ? samples : usual, true);
+    }
+
+    // Whoever writes reads the reason from the stream.
+    void noteFailure() {
+        const Any name = stream_.getParam("outfilename");
+        const auto code = film_.outputFailed() ? EIO : EINVAL;
+        stream_.failure()->note(code, film_.problem().c_str(),
+                                name.isText() ? qv_wide_name(qv_os_name(name)) : QvWideString());
+    }
+};
+
+UnitStream::UnitStream(QvCodec* owner) : QvBufStream(owner) { setParam("writeThrough", 1); }
+
+UnitStream::~UnitStream() = default;
+
+bufstream* UnitStream::input() { return record_ ? record_->record() : nullptr; }
+
+int UnitStream::begin(FilmWriter& film, std::size_t track) {
+    if (const int result = QvBufStream::init(params())) return result;
+    record_ = std::make_unique<Record>(*this, film, track);
+    setInited(true);
+    return QvStatus::ok;
+}
+
+bool UnitStream::finish() { return !record_ || record_->finish(); }
+
+void UnitStream::destroy(int) {
+    record_.reset();
+    setInited(false);
+}
+
+}  // namespace av
