@@ -4,11 +4,15 @@
 #include "tarsel/commands/outputoptions.h"
 #include "tarsel/commands/progressoption.h"
 #include "tarsel/commands/transcode.h"
+#include "tarsel/host/outputs/streamoutput.h"
 #include "tarsel/host/signals.h"
 #include "tarsel/job/job.h"
 #include "tarsel/job/plan/outputform.h"
 #include "tarsel/job/post.h"
+#include "tarsel/presets/codecnames.h"
+#include "tarsel/presets/presetchoice.h"
 #include "tarsel/words/commandline.h"
+#include "tarsel/words/keyvalues.h"
 #include "tarsel/words/messages.h"
 #include "tarsel/words/rawnames.h"
 #include "tarsel/words/timespec.h"
@@ -27,18 +31,64 @@ int parseBits(const std::string& text) {
     throw failure(Msg::bitsWrong, {"--bits", text});
 }
 
-// Of a name that the tool gives no meaning itself, the extension may say the preset.
-void choosePreset(JobOptions& job) {
-    const bool writes = job.muxer != "nullmux";
-    const std::string extension = writes && !job.output.empty() ? formatName(job) : "";
-    if (!job.presetName.empty() || (!extension.empty() && !writesItself(extension)))
-        job.preset = outputPreset(job.presetName, extension, writes ? job.muxer : "", job.output);
+// The null device has no name that says a format, and needs none.
+bool discards(const JobOptions& job) {
+    const auto stream = job.output.empty() ? nullptr : StreamOutput::find(job.output, {});
+    return stream && stream->discards();
+}
+
+OutputWish wishOf(const GivenJob& given) {
+    const JobOptions& job = given.job;
+    OutputWish wish;
+    wish.preset = job.presetName;
+    wish.output = job.output;
+    wish.video = parseCodec(given.vcodec, qvVideoStream);
+    wish.audio = parseCodec(given.acodec, qvAudioStream);
+    if (job.muxer == "nullmux" || job.output.empty()) return wish;
+    wish.extension = formatName(job);
+    wish.own = writesItself(wish.extension);
+    wish.muxer = job.muxer;
+    if (wish.extension.empty() && wish.namesCodecs() && job.presetName.empty() && !discards(job))
+        throw job.output == "-" ? failure(Msg::streamNeedsFormat)
+                                : failure(Msg::outputFormatMissing, {job.output});
+    return wish;
+}
+
+// What is set has to have an encoder.
+void checkEncoders(const JobOptions& job, const OutputWish& wish) {
+    job.encoders.check();
+    if (job.preset || !(wish.own || wish.extension.empty())) return;
+    for (const int type : {qvVideoStream, qvAudioStream})
+        if (const std::string option = job.encoders.given(type); !option.empty())
+            throw failure(Msg::encoderRaw, {option, job.output});
+}
+
+// The encoders that --vcodec and --acodec name, or the extension of a name to which the tool itself gives no
+// meaning, may say the preset.
+void choosePreset(GivenJob& given) {
+    JobOptions& job = given.job;
+    const OutputWish wish = wishOf(given);
+    job.noVideo |= wish.video.none;
+    job.noAudio |= wish.audio.none;
+    job.encoders.video = wish.video.settings;
+    job.encoders.audio = wish.audio.settings;
+    job.preset = outputPreset(wish);
+    checkEncoders(job, wish);
     if (!job.preset && job.match) throw failure(Msg::matchNoPreset);
     if (!job.preset) return;
     const QvPreset& preset = job.preset->preset();
     const std::string command = preset.isCustom() ? preset.postprocessCmd().toString().asString("") : "";
     if (!command.empty() && job.post.empty())
         job.warnings.push_back(lineOf(Msg::presetCommandLeft, {preset.name(), command}));
+}
+
+// "NAME:key=value,...".
+void parseMuxer(JobOptions& job) {
+    const size_t colon = job.muxer.find(':');
+    if (colon == std::string::npos) return;
+    const std::string text = job.muxer.substr(colon + 1);
+    job.muxer.resize(colon);
+    job.muxerSettings = KeyValues(text, {}, "--muxer " + job.muxer).all();
 }
 
 void checkMuxer(const JobOptions& job) {
@@ -71,7 +121,8 @@ void resolveJob(GivenJob& given) {
     if (!given.channels.empty())
         job.channels = static_cast<int>(parseNumber(given.channels, 1, 8, "--channels"));
     if (!given.bits.empty()) job.bits = parseBits(given.bits);
-    choosePreset(job);
+    parseMuxer(job);
+    choosePreset(given);
     checkMuxer(job);
 }
 
@@ -104,6 +155,13 @@ std::vector<std::string> outputFormats() {
     return names;
 }
 
+std::vector<std::string> offeredCodecs(int type) {
+    std::vector<std::string> names = {"none"};
+    for (const CodecName& row : codecNames())
+        if (row.type == type) names.emplace_back(row.name);
+    return names;
+}
+
 }  // namespace
 
 void addJobOptions(Command& command, GivenJob& given, Need inputs) {
@@ -116,6 +174,17 @@ void addJobOptions(Command& command, GivenJob& given, Need inputs) {
     command.option("--format", job.format, "What to write, in the place of an extension: wav, raw, ...",
                    "EXT", outputFormats());
     command.option("--preset", job.presetName, "What the output is to be, see 'tarsel presets list'", "NAME");
+    command.option("--vcodec", given.vcodec,
+                   "Encoder of the picture: h264, prores, ..., a module, or none; settings as h264:tune=film",
+                   "NAME[:K=V,...]", offeredCodecs(qvVideoStream));
+    command.option("--acodec", given.acodec,
+                   "Encoder of the sound: aac, flac, pcm, ..., a module, or none; settings as aac:profile=1",
+                   "NAME[:K=V,...]", offeredCodecs(qvAudioStream));
+    command.option("--crf", job.encoders.crf, "Quality that the picture's encoder keeps, in its own scale",
+                   "N");
+    command.option("--bitrate", job.encoders.bitrate, "Bit rate of the picture: 800k, 5M, ...", "RATE");
+    command.option("--audio-bitrate", job.encoders.audioBitrate, "Bit rate of the sound: 128k, ...", "RATE");
+    command.flag("--two-pass", job.encoders.twoPass, "Read the picture twice, to spend its bits better");
     command.flag("--match", job.match, "Choose the values nearest to the INPUT that the preset allows");
     command.flag("--join", job.join,
                  "The INPUTs are segments NAME[@FROM-TO], one after the other; A+B is read side by side");
@@ -133,8 +202,9 @@ void addJobOptions(Command& command, GivenJob& given, Need inputs) {
     command.option("--bits", given.bits, "Bits of a sample: 8, 16 or 24", "N");
     command.flag("--shortest", job.shortest, "End the picture with its sound");
     command.flag("--longest", job.longest, "Hold the last picture until the sound has ended");
-    command.option("--muxer", job.muxer, "nullmux: do everything but write; or one that the preset allows",
-                   "NAME", {"nullmux", "rawmux", "rawavimux"});
+    command.option("--muxer", job.muxer,
+                   "nullmux: do everything but write; or one that the preset allows; settings as mp4mux:K=V",
+                   "NAME[:K=V,...]", {"nullmux", "rawmux", "rawavimux"});
     command.option("--post", job.post,
                    "A command run afterwards; %i and %o stand for the inputs and outputs, %o1 for the first",
                    "CMD");

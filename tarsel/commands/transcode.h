@@ -10,6 +10,7 @@
 struct GivenJob {
     JobOptions job;
     std::string samplerate, channels, bits;
+    std::string vcodec, acodec;  // NAME[:key=value,...]
 };
 
 void addJobOptions(Command& command, GivenJob& given, Need inputs);

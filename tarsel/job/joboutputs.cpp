@@ -26,7 +26,7 @@ void JobOutputs::claim(const JobPlan& plan, const std::vector<std::string>& inpu
         checkNumbers(plan);
         checkNames(pipe);
     }
-    if (form_.takesOneStream()) claimPlace(stream_->place(), stream_->name());
+    if (form_.isStream()) claimPlace(stream_->place(), stream_->name());
     claimFilterFiles(plan.filterFiles.written);
     claimTask();
 }

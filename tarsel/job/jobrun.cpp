@@ -19,7 +19,7 @@ namespace {
 
 // What is said when the process ends at once.
 std::optional<Msg> lastWordOf(const OutputForm& output) {
-    if (!output.takesOneStream()) return std::nullopt;
+    if (!output.isStream()) return std::nullopt;
     return Msg::stoppedWithPart;
 }
 
@@ -99,7 +99,7 @@ void JobRun::transcode(const std::vector<ProcessParams>& params) {
         drive(transcoder);
     } catch (...) {
         stopIfSignalled();
-        lengths_.check(!plan_.output.takesOneStream());
+        lengths_.check(!plan_.output.isStream());
         throwBetter(memory.ranOut(), plan_.output.name);
     }
     checkAndCommit();
@@ -145,7 +145,7 @@ int JobRun::start(JobTranscoder& transcoder) {
 }
 
 void JobRun::checkAndCommit() {
-    lengths_.check(!plan_.output.takesOneStream());
+    lengths_.check(!plan_.output.isStream());
     warnings_.addEngine([this](const std::string& text) { return parts_.outputs.withFinalNames(text); });
     if (const std::string lost = Events::get().lost(); !lost.empty()) warnings_.add(lost);
     if (endedEarly_) {
@@ -163,7 +163,7 @@ void JobRun::checkAndCommit() {
 void JobRun::stopIfSignalled() const {
     const Exit signalled = signals_.received();
     if (signalled == Exit::done) return;
-    const bool part = plan_.output.takesOneStream() && parts_.taken() > 0;
+    const bool part = plan_.output.isStream() && parts_.taken() > 0;
     throw Failure(signalled,
                   part ? lineOf(Msg::stoppedWithPart, {plan_.output.name}) : lineOf(Msg::stoppedWithNothing));
 }

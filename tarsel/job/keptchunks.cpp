@@ -56,7 +56,7 @@ void countClipping(const JobParts& parts) {
 void carryChunks(const JobParts& parts, Warnings& warnings) {
     const JobPlan& plan = parts.plan;
     if (plan.output.writesNothing()) return;
-    const bool isWav = plan.output.kind != OutputKind::avi && !plan.output.takesOneStream();
+    const bool isWav = plan.output.kind != OutputKind::avi && !plan.output.isStream();
     for (const PlannedStream& stream : plan.streams) {
         if (stream.isVideo()) continue;
         QvBufStream* const file = isWav ? parts.file(stream) : nullptr;

@@ -3,10 +3,18 @@
 #include <string_view>
 
 #include "tarsel/job/plan/presetplan.h"
+#include "tarsel/source/setting.h"
 #include "tarsel/source/source.h"
 #include "tarsel/words/messages.h"
 
 namespace {
+
+void setOptional(QvCodec& codec, const char* name, const Any& value) {
+    try {
+        codec.setParam(name, value);
+    } catch (const QvParamException&) {  // not one of its parameters
+    }
+}
 
 void setMuxer(QvEncodePipe& pipe, const OutputForm& output) {
     const char* muxer = output.muxer();
@@ -18,8 +26,10 @@ void setMuxer(QvEncodePipe& pipe, const OutputForm& output) {
         m.setParam("splitVideo", 1);
         m.setParam("rawAsPng", 1);
     }
-    const bool toStream = output.takesOneStream() || output.place == OutputPlace::nullDevice;
+    const bool toStream = output.isStream() || output.place == OutputPlace::nullDevice;
     if (output.splitChannels && !toStream) setChecked(m, "splitAudio", 1, "--split-channels");
+    for (const auto& [key, value] : output.muxerSettings)
+        setGuessed(m, key, value, std::string("--muxer ") + m.name());
 }
 
 void addStream(QvEncodePipe& pipe, const OutputForm& output, const PlannedStream& stream) {
@@ -64,10 +74,13 @@ std::unique_ptr<QvEncodePipe> makeOutputPipe(const JobPlan& plan, bool acceptPar
 }
 
 void fitToPlace(QvEncodePipe& pipe, const JobPlan& plan, bool acceptPartial) {
-    const bool toStream = plan.output.takesOneStream();
+    const bool toStream = plan.output.isStream();
     QvMuxer& muxer = *pipe.getMuxer();
-    if (std::string_view(muxer.name()) == "rawmux") muxer.setParam("exactName", toStream ? 1 : 0);
-    if (!toStream || acceptPartial) return;
+    const bool raw = std::string_view(muxer.name()) == "rawmux";
+    if (raw) muxer.setParam("exactName", toStream ? 1 : 0);
+    // What was written there can't be gone back to.
+    if (!raw && toStream) setOptional(muxer, "seekable", 0);
+    if (!raw || !toStream || acceptPartial) return;
     for (const PlannedStream& stream : plan.streams)
         if (!stream.isVideo())
             muxer.stream(stream.type, stream.number)->setParam("expectedSamples", Any(stream.expected));

@@ -110,5 +110,5 @@ void checkResult(const JobParts& parts, const std::vector<long long>& written, b
     }
     checkJoined(parts, acceptPartial, warnings);
     if (parts.outputs.files()) checkFiles(parts, written);
-    if (plan.output.takesOneStream()) checkTaken(parts, written.front());
+    if (plan.output.isStream()) checkTaken(parts, written.front());
 }

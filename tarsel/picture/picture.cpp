@@ -1,7 +1,6 @@
 #include "tarsel/picture/picture.h"
 
 #include <algorithm>
-#include <charconv>
 #include <cstring>
 #include <new>
 
@@ -9,8 +8,8 @@
 #include "tarsel/host/memory.h"
 #include "tarsel/picture/overlays.h"
 #include "tarsel/picture/sizes.h"
+#include "tarsel/source/setting.h"
 #include "tarsel/words/keyvalues.h"
-#include "tarsel/words/listvalue.h"
 #include "tarsel/words/messages.h"
 #include "tarsel/words/rawnames.h"
 #include "tarsel/words/timespec.h"
@@ -32,32 +31,6 @@ unsigned frameFormat(unsigned fourcc) {
     } catch (const QvException&) {
     }
     return QvFourcc::BGR3;
-}
-
-// A value of --filter as the type that it looks like.
-Any valueOf(const std::string& text) {
-    char* end = nullptr;
-    const long long whole = std::strtoll(text.c_str(), &end, 10);
-    if (!text.empty() && *end == '\0' && whole >= INT32_MIN && whole <= INT32_MAX)
-        return Any(static_cast<int>(whole));
-    double number = 0;
-    const auto [rest, error] = std::from_chars(text.data(), text.data() + text.size(), number);
-    if (error == std::errc() && rest == text.data() + text.size()) return Any(number);
-    return Any(text.c_str());
-}
-
-// Text of digits may be meant as text.
-void setGuessed(QvCodec& filter, const std::string& key, const std::string& text, const std::string& option) {
-    if (filter.getParam(key.c_str()).isVector())
-        return setChecked(filter, key, parseList(text, option + " " + key), option);
-    const Any value = valueOf(text);
-    if (!value.isText() && filter.getParam(key.c_str()).isText()) {
-        try {
-            return setChecked(filter, key, Any(text.c_str()), option);
-        } catch (const Failure&) {
-        }
-    }
-    setChecked(filter, key, value, option);
 }
 
 AnyDict scalerState(int width, int height, unsigned fourcc) {

@@ -1,4 +1,5 @@
-// What an output's name means beyond the formats of the tool itself: the presets of an extension.
+// What an output's name means beyond the formats of the tool itself: the presets of an extension, and the
+// codecs where none of them is installed.
 #pragma once
 
 #include <span>
@@ -8,8 +9,12 @@ struct PresetExtension {
     static constexpr int most = 3;
     std::string_view extension;  // without the dot, in small letters
     const char* muxer;
-    const char* symbols[most];  // of the presets, the first one that is installed is taken; null for none
+    const char* video;  // codec, by its name in the table of codecs; null for files of sound alone
+    const char* audio;  // null for pictures alone
+    const char* presets[most] = {};    // names or symbols, the first one that is installed is taken
     const char* otherMuxer = nullptr;  // for presets that do not have the first one; null for none
+
+    bool soundOnly() const { return !video; }
 };
 
 std::span<const PresetExtension> presetExtensions();

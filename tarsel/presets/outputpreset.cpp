@@ -2,7 +2,6 @@
 
 #include <string_view>
 
-#include "tarsel/presets/extensions.h"
 #include "tarsel/presets/presetsearch.h"
 #include "tarsel/presets/presetwords.h"
 #include "tarsel/words/messages.h"
@@ -43,46 +42,33 @@ QvPreset withMuxer(const QvPreset& preset, const char* muxer) {
     return other;
 }
 
-// The multiplexer with which a preset writes files of an extension; null if it does not.
-const char* muxerFor(const QvPreset& preset, const PresetExtension& row) {
-    for (const char* muxer : {row.muxer, row.otherMuxer})
-        if (muxer && preset.muxerAllowed(muxer)) return muxer;
-    return nullptr;
-}
-
-std::shared_ptr<const OutputPreset> byExtension(const PresetExtension& row, const std::string& muxer,
-                                                const std::string& output) {
-    const QvPresetMgr& catalogue = *qvPresetMgr();
-    for (const char* symbol : row.symbols) {
-        const int index = symbol ? catalogue.findByProfile(qvSymToProfile(symbol)) : -1;
-        if (index < 0) continue;
-        const QvPreset preset = catalogue.builtinPreset(index);
-        if (const char* const own = muxerFor(preset, row))
-            return std::make_shared<OutputPreset>(preset, muxer.empty() ? own : muxer);
-    }
-    throw failure(Msg::outputNoPreset, {output});  // none of them is installed
-}
-
 }  // namespace
 
 bool isRawEncoderName(std::string_view name) { return name == "rawvenc" || name == "rawaenc"; }
 bool isRawEncoder(const QvCodec& encoder) { return isRawEncoderName(encoder.name()); }
 
-OutputPreset::OutputPreset(const QvPreset& preset, const std::string& muxer)
-    : preset_(preset), muxer_(muxer.empty() ? defaultMuxer(preset) : muxer) {
+OutputPreset::OutputPreset(const QvPreset& preset, const std::string& muxer, const ChosenEncoders& encoders,
+                           const std::string& reason)
+    : preset_(preset),
+      muxer_(muxer.empty() ? defaultMuxer(preset) : muxer),
+      encoders_(encoders),
+      reason_(reason) {
     if (!preset_.isValid()) throw failure(Msg::presetInvalid, {name(), faultOf(preset_)});
     if (!muxer.empty() && !preset_.muxerAllowed(muxer.c_str()))
         throw failure(Msg::presetMuxer, {muxer, name(), namesOf(preset_.muxers())});
 }
 
 bool OutputPreset::has(int type) const {
+    if (!encoders_.of(type).empty()) return true;
     if (preset_.isCustom() && preset_.get("streams").isVector())
         return !preset_.streamParams(type, 0, nullptr).empty();
     return !preset_.getCompatible(muxer_.c_str(), encoderKind(type)).empty();
 }
 
 bool OutputPreset::isRaw() const {
-    return preset_.videoCodecs().at(0) == "rawvenc" && (muxer_ == "rawmux" || muxer_ == "rawavimux");
+    const std::string& video = encoders_.video;
+    return (video.empty() ? preset_.videoCodecs().at(0) == "rawvenc" : video == "rawvenc") &&
+           (muxer_ == "rawmux" || muxer_ == "rawavimux");
 }
 
 std::unique_ptr<QvEncodePipe> OutputPreset::makePipe(const char* muxer) const {
@@ -99,7 +85,8 @@ std::unique_ptr<QvEncodePipe> OutputPreset::makePipe(const char* muxer) const {
 }
 
 QvEncoder& OutputPreset::addStream(QvEncodePipe& pipe, int type) const {
-    const int number = pipe.addStream(type, Any());
+    const std::string& encoder = encoders_.of(type);
+    const int number = pipe.addStream(type, encoder.empty() ? Any() : Any(encoder.c_str()));
     if (number < 0)
         throw failure(Msg::presetNoStream,
                       {name(), type == qvVideoStream ? "picture" : "sound", pipe.errorDesc()});
@@ -118,6 +105,8 @@ AnyDict OutputPreset::storedCodec(int type, int number) const {
     if (!preset_.isCustom()) return AnyDict();
     const AnyDict stream = preset_.streamParams(type, number, nullptr);
     const AnyDict codec = stream.getDict("codec", AnyDict());
+    const std::string& chosen = encoders_.of(type);
+    if (!chosen.empty() && !(codec.get("name") == chosen.c_str())) return AnyDict();
     return codec.getDict("settingsDict", codec);
 }
 
@@ -147,17 +136,4 @@ PresetSound OutputPreset::sound(const QvCodec& encoder, int number, bool fitted)
     };
     return {asked("samplerate", "samplerateRange"), asked("channels", "channelsRange"),
             asked("bitsPerSample", "bitsPerSampleRange")};
-}
-
-std::shared_ptr<const OutputPreset> outputPreset(const std::string& name, const std::string& extension,
-                                                 const std::string& muxer, const std::string& output) {
-    if (name.empty()) {
-        const PresetExtension* const row = presetExtension(extension);
-        return row ? byExtension(*row, muxer, output) : nullptr;
-    }
-    const QvPreset preset = findPreset(name);
-    const PresetExtension* const row =
-        muxer.empty() && preset.isBuiltin() ? presetExtension(extension) : nullptr;
-    const char* const own = row ? muxerFor(preset, *row) : nullptr;
-    return std::make_shared<OutputPreset>(preset, own ? own : muxer);
 }

@@ -20,14 +20,25 @@ struct PresetSound {
     std::optional<int> samplerate, channels, bits;
 };
 
+// Encoders that an output is to have; empty for the preset's own.
+struct ChosenEncoders {
+    const std::string& of(int type) const { return type == qvVideoStream ? video : audio; }
+
+    std::string video, audio;
+};
+
 class OutputPreset {
   public:
-    // `muxer`: one of those that the preset allows; empty for its default. Throws Failure.
-    OutputPreset(const QvPreset& preset, const std::string& muxer);
+    // `muxer`: one of those that the preset allows; empty for its default. `encoders` go with it under the
+    // preset. `reason`: why the tool chose this preset, for --dry-run; empty where the user did. Throws
+    // Failure.
+    OutputPreset(const QvPreset& preset, const std::string& muxer, const ChosenEncoders& encoders = {},
+                 const std::string& reason = "");
 
     const QvPreset& preset() const { return preset_; }
     std::string name() const { return preset_.name(); }
     const std::string& muxer() const { return muxer_; }
+    const std::string& reason() const { return reason_; }
     // Whether outputs have streams of this type.
     bool has(int type) const;
     // Whether the streams are those that the tool writes by itself, without an encoder.
@@ -35,7 +46,7 @@ class OutputPreset {
 
     // A pipe with this preset, without streams, that writes by `muxer`. Throws Failure.
     std::unique_ptr<QvEncodePipe> makePipe(const char* muxer) const;
-    // Adds the next stream of a type with the preset's settings. Throws Failure.
+    // Adds the next stream of a type, with the preset's settings of its encoder. Throws Failure.
     QvEncoder& addStream(QvEncodePipe& pipe, int type) const;
     // What the encoder of the number-th stream is set to. `fitted`: to an input, so that what it can't be set
     // to is left open.
@@ -51,14 +62,10 @@ class OutputPreset {
 
     QvPreset preset_;
     std::string muxer_;
+    ChosenEncoders encoders_;
+    std::string reason_;
 };
 
 // Whether an encoder takes any format, so that what it lists is a proposal only.
 bool isRawEncoder(const QvCodec& encoder);
 bool isRawEncoderName(std::string_view name);
-
-// Of a job's options: the preset named, or, without a name, the first one that goes with the extension of an
-// output that nothing else writes; null for none. `muxer`: that of --muxer, or empty. `output`: its name as
-// the user gave it. Throws Failure.
-std::shared_ptr<const OutputPreset> outputPreset(const std::string& name, const std::string& extension,
-                                                 const std::string& muxer, const std::string& output);

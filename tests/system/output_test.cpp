@@ -99,7 +99,7 @@ TEST_F(Output, PlacesThatTakeNone) {
         fs::permissions(folder.file("locked"), fs::perms::owner_read | fs::perms::owner_exec);
         fails(4, {"transcode", "in.wav", "-o", "locked/out.wav"}, {"may not be written"});
     }
-    fails(2, {"transcode", "in.wav", "-o", "out.mp3"}, {"'mp3'", "tarsel formats"});
+    fails(2, {"transcode", "in.wav", "-o", "out.mp9"}, {"'mp9'", "tarsel formats"});
     fails(2, {"transcode", "in.wav", "-o", "out.wva"}, {"'wva'", "Did you mean 'wav'?"});
 }
 

@@ -23,6 +23,8 @@ SoundFormat soundFormat(const PlanOptions& options, const SoundFormat& in) {
             options.bits.value_or(in.bits)};
 }
 
+bool holdsSoundAlone(const OutputForm& output) { return output.kind == OutputKind::wav || output.soundOnly; }
+
 // What a preset has no stream for is left out, with a word.
 bool lacks(JobPlan& plan, const JobInput& input, int type) {
     if (!plan.preset || plan.preset->has(type)) return false;
@@ -36,8 +38,7 @@ void takeStreams(JobPlan& plan, const PlanOptions& options, const KnownFormats* 
     for (size_t input = 0; input < plan.inputs.size(); ++input) {
         if (plan.inputs[input].joined) continue;
         for (const int type : {qvVideoStream, qvAudioStream}) {
-            if (unwanted(options, type) || (type == qvVideoStream && plan.output.kind == OutputKind::wav))
-                continue;
+            if (unwanted(options, type) || (type == qvVideoStream && holdsSoundAlone(plan.output))) continue;
             if (lacks(plan, plan.inputs[input], type)) continue;
             // --map chooses one of the sounds.
             const bool chosen = !options.sound.map.empty() && type == qvAudioStream && !plan.hasVideo();
@@ -67,8 +68,10 @@ void checkKinds(JobPlan& plan, const PlanOptions& options) {
     if (plan.preset && !plan.preset->has(qvVideoStream) && !plan.preset->has(qvAudioStream))
         throw failure(Msg::presetEmpty, {plan.preset->name(), output.name});
     if (plan.streams.empty())
-        throw failure(output.kind == OutputKind::wav ? Msg::inputNoSound : Msg::inputNoStreams,
-                      {output.name});
+        throw failure(holdsSoundAlone(output) ? Msg::inputNoSound : Msg::inputNoStreams, {output.name});
+    for (const int type : {qvVideoStream, qvAudioStream})
+        if (const std::string option = options.encoders.given(type); !option.empty() && plan.count(type) == 0)
+            throw failure(Msg::encoderNoStream, {option, type == qvVideoStream ? "picture" : "sound"});
     if (output.kind == OutputKind::byInput) output.kind = plan.hasVideo() ? OutputKind::raw : OutputKind::wav;
     const bool sound = output.kind == OutputKind::wav || output.kind == OutputKind::nothing ||
                        output.kind == OutputKind::module;
@@ -226,6 +229,8 @@ std::string planText(const JobPlan& plan) {
         text += "expect  " + std::to_string(stream.expected) + " " + stream.unit() + ", " +
                 std::to_string(stream.bytes(stream.expected)) + " bytes\n";
     }
+    if (plan.preset && !plan.preset->reason().empty())
+        text += "preset  " + inQuotes(plan.preset->name()) + ", " + plan.preset->reason() + "\n";
     const bool nowhere = plan.output.place == OutputPlace::nowhere;
     return text + "output  " + (nowhere ? "nothing" : inQuotes(plan.output.name)) + " by " +
            plan.output.muxer() + ", " + formatBytes(plan.bytes()) + "\n";

@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "tarsel/host/files.h"
+#include "tarsel/presets/extensions.h"
 #include "tarsel/words/messages.h"
 #include "tarsel/words/rawnames.h"
 #include "tarsel/words/timespec.h"
@@ -135,14 +136,18 @@ OutputForm outputForm(const PlanOptions& options, OutputPlace place) {
     form.name = options.output;
     form.pixel = options.effects.pixel;
     form.splitChannels = options.splitChannels;
+    form.muxerSettings = options.muxerSettings;
     if (form.name.empty() && !options.inputs.empty()) form.name = options.inputs.front();
     if (place == OutputPlace::nowhere) return form;
     form.kind = kindOf(options, place);
     checkMuxer(options, form.kind);
-    if (form.kind == OutputKind::module)
+    if (form.kind == OutputKind::module) {
         form.muxerModule = options.preset ? options.preset->muxer() : options.muxer;
+        const PresetExtension* const row = presetExtension(formatName(options));
+        form.soundOnly = row && row->soundOnly();
+    }
     form.pixel = pixelOf(options, form.kind);
-    if (form.takesOneStream()) checkStream(options, form.kind);
+    if (form.isStream()) checkStream(options, form.kind);
     if (form.isFiles()) takeNumbers(options, form);
     return form;
 }

@@ -22,14 +22,18 @@ struct OutputForm {
     std::optional<NumberedName> numbered;
     bool splitChannels = false;  // a file for each channel
 
-    std::string muxerModule;  // of OutputKind::module
+    EncoderOptions::Settings muxerSettings;  // of --muxer
+    std::string muxerModule;                 // of OutputKind::module
+    bool soundOnly = false;                  // of OutputKind::module: files of this name have no picture
 
     // One file, whatever streams there are.
     bool isOneFile() const {
         return kind == OutputKind::avi || (kind == OutputKind::module && muxerModule != "rawmux");
     }
     bool isFiles() const { return place == OutputPlace::files; }
-    bool takesOneStream() const { return place == OutputPlace::stream; }
+    // A pipe, a device: what has gone there stays.
+    bool isStream() const { return place == OutputPlace::stream; }
+    bool takesOneStream() const { return isStream() && !isOneFile(); }
     bool writesNothing() const { return kind == OutputKind::nothing || place == OutputPlace::nullDevice; }
     // The engine's modules and the extension of its first file.
     const char* muxer() const;

@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "tarsel/picture/effects.h"
+#include "tarsel/presets/encoderoptions.h"
 #include "tarsel/presets/outputpreset.h"
 #include "tarsel/sound/soundoptions.h"
 
@@ -34,6 +35,8 @@ struct PlanOptions {
     std::optional<OutputKind> kind;  // of a stored task's output, whatever its name says
     EffectOptions effects;
     SoundOptions sound;
+    EncoderOptions encoders;
+    EncoderOptions::Settings muxerSettings;
     std::optional<int> samplerate, channels, bits;
     bool noVideo = false, noAudio = false;
     bool shortest = false, longest = false;

@@ -75,6 +75,7 @@ void PresetPlanner::takeEncoder(PlannedStream& stream) {
     QvEncoder& encoder = plan_.preset->addStream(*pipe_, stream.type);
     stream.module = encoder.name();
     if (options_.fit) options_.fit(stream.type, stream.part.input, stream.part.stream, encoder);
+    setEncoder(encoder, stream.type, options_.encoders, plan_.output.name);
 }
 
 PictureFormat PresetPlanner::wanted(const PlannedStream& stream, const QvCodec& encoder, bool& asks) const {

@@ -1,0 +1,29 @@
+// What the user sets an output's encoders to, whichever they are.
+#pragma once
+
+#include <string>
+#include <utility>
+#include <vector>
+
+#include <qvplugcore/qvplugcore.h>
+
+// Texts are as they were given; empty when they were not.
+struct EncoderOptions {
+    using Settings = std::vector<std::pair<std::string, std::string>>;
+
+    // The first one that asks something of the encoders of this type of stream; empty for none.
+    std::string given(int type) const;
+    // Throws Failure (usage) for options that exclude each other.
+    void check() const;
+
+    std::string crf, bitrate, audioBitrate;
+    bool twoPass = false;
+    Settings video, audio;  // of --vcodec and --acodec
+};
+
+// A bit rate: "800k", "5M", "1.5M", or bits a second. Throws Failure (usage).
+int parseBitrate(const std::string& text, const std::string& option);
+
+// Sets an encoder of a type. `output`: for messages. Throws Failure for what it does not have, or does not
+// take.
+void setEncoder(QvEncoder& encoder, int type, const EncoderOptions& options, const std::string& output);
