@@ -27,9 +27,9 @@ class QV_API QvWatchFolderInput {
     QvWatchFolderInput() = default;
     virtual ~QvWatchFolderInput() = default;
 
-    // Opens a folder, anew if one is open, and scans it. `moveTo` is needed by `move` alone, and is made if
-    // it does not exist; `extra` is not used. 0; -9 if `folder` is none; -13 without a needed `moveTo`. An
-    // unknown mode is an assertion of fileProcessed(), which then leaves the file alone.
+    // Opens a folder, in place of one that is open, and scans it. Only `move` needs `moveTo`, which is made
+    // if it does not exist; `extra` is not used. 0; -9 if `folder` is not a folder; -13 without a needed
+    // `moveTo`. An unknown mode is an assertion of fileProcessed(), which then leaves the file alone.
     int open(const Any& folder, int mode, const Any* moveTo = nullptr, const Any* extra = nullptr);
     void close();
     bool isOpen() const { return opened_; }

@@ -1,5 +1,6 @@
-// What the decoder "aumixdec" is to read: for each output channel the channels of streams of files that feed
-// it, with their weights. Stores as a dictionary ("AudioMixSetup") and as an element of a metafile.
+// What the decoder "aumixdec" is to read: for each output channel the channels that feed it, each of a stream
+// of a file, with their weights. It is stored as a dictionary ("AudioMixSetup") and as an element of a
+// metafile.
 //
 //     QvAudioMixDecSetup setup;
 //     setup.setInFileNames(AnyVector(Any("left.wav"), Any("right.wav")));  // two channels, both silent
@@ -7,7 +8,7 @@
 //     setup.setWeight(1, 1, 0, 0, 1.0);
 //     QvDecodePipe* decoder = setup.createMixDecoder(0);
 //
-// Functions that take an index answer -1 (or null) for one out of range.
+// Functions with an index return -1 (or null) if it is out of range.
 #pragma once
 
 #include <memory>
@@ -22,7 +23,8 @@ class QvDecodePipe;
 
 class QV_API QvAudioMixDecSetup {
   public:
-    static constexpr int maxChannels = 256;  // what check() lets pass; also of a file, and streams of a file
+    static constexpr int maxChannels =
+        256;  // that check() accepts: of the mix, of a file; also streams of a file
 
     QvAudioMixDecSetup() = default;
 
@@ -31,8 +33,8 @@ class QV_API QvAudioMixDecSetup {
     Any inFileName(int file) const;
     const AnyVector& inFileNames() const { return inFileNames_; }
 
-    // Silent channels in place of those that are there. -1 for a negative number, and whenever there are more
-    // than 16 at present.
+    // Replaces the output channels by silent ones. -1 for a negative number, and whenever there are more than
+    // 16 before the call.
     int setNrOutChannels(int n);
     int nrOutChannels() const { return outChannels_.size(); }
     int setChannelPosition(int channel, const char* position);
@@ -65,8 +67,8 @@ class QV_API QvAudioMixDecSetup {
     // From a metafile: its code if it can't be opened; -1 if it holds no set-up. The log has the reason.
     int load(const Any& path);
 
-    // Why a dictionary would not be mixed as it says: a word that describes the first wrong entry; empty if
-    // all are sound. restore() takes what it can.
+    // The first wrong entry of a dictionary, as a word that describes it; empty if all are valid. restore()
+    // accepts wrong entries, and uses what it can of them.
     static std::string check(const AnyDict& dict);
 
     // An open decoder of one audio stream for the caller, at `targetSamplerate` or, for 0, the highest rate

@@ -1,11 +1,11 @@
-// A metafile: a small XML document that stands for an input made of other inputs. It is a list of named
+// A metafile: a small XML document that describes an input made of other inputs. It is a list of named
 // elements, each a value of its own. "AudioInterleave" (QvAudioMixDecSetup) and "MonoInterleave" (one file a
 // channel, read only) are built in; others are known through a translator for their tag.
 //
 //     QvMetafile file("mix.mmf");
 //     if (file.errorCode() == 0 && file.contains("AudioInterleave")) use(file.element("AudioInterleave"));
 //
-// Files come from anywhere: check() reports beforehand the damaged elements that are assertions in open().
+// Check files of any origin with check() first: a damaged element is an assertion in open().
 #pragma once
 
 #include <memory>
@@ -31,8 +31,7 @@ class QV_API QvMetafile {
     // "MonoInterleave" are unchanged. 0; -15 if the file can't be read or is no metafile; the XML reader's
     // code if it is not well formed. A damaged element is an assertion, see check().
     int open(const Any& path);
-    // Why open() would refuse the file, or meet an assertion: with the line where it is known. Empty if it
-    // would do neither.
+    // Why open() would fail or assert, with the line if it is known; "" if it would do neither.
     static std::string check(const Any& path);
     // 0. Throws QvFileException as XmlParser::storeXmlTree does.
     int save(const Any& path);

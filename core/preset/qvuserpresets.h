@@ -1,5 +1,5 @@
 // The store of user presets: a list that is read from and written to one XML file. It also reads the older
-// form, whose presets it lifts to today's profiles and modules, and keeps track of changes.
+// form, whose presets it converts to the profiles and modules of today, and keeps track of changes.
 //
 //     QvUserPresets mine;
 //     if (mine.load("presets.xml", QvUserPresets::clearFirst) == 0) mine.apply("Web", &pipe);
@@ -24,7 +24,7 @@ class QV_API QvUserPresets : public QvPresetList {
     enum Check {
         describeInvalid = 1,  // makes the "info" of invalid presets too
         removeInvalid = 2,
-        substituteModules = 8  // modules that are missing give way to those that can stand in for them
+        substituteModules = 8  // replaces missing modules by others that do the same
     };
 
     QvUserPresets() = default;
@@ -60,10 +60,10 @@ class QV_API QvUserPresets : public QvPresetList {
     // Reads a file of either form: 0; -1 if it is no file of presets, or if an element of the older form
     // could not be read; the XML reader's code if it can't be read. `version` receives 1 or 2 for the form. A
     // damaged element of the current form is an assertion, and so is one of the older form without "params";
-    // the list is unchanged then. Files that come from outside are looked at with check() first.
+    // the list is unchanged then. Check files of other origin with check() first.
     int load(const Any& file, int mode, int* version = nullptr);
-    // Looks whether load() can read the file without an assertion: an empty text, or what is wrong with it.
-    // What a preset may not be named, where it replaces one of this list, is not looked at: see set().
+    // Whether load() can read the file without an assertion: "", or a text that says what is wrong. Names
+    // that set() does not allow are not checked.
     static std::string check(const Any& file);
     // Writes the current form: 0, or the XML writer's code. Throws as XmlParser::storeDict.
     int save(const Any& file);

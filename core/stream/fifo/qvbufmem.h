@@ -63,8 +63,8 @@ class QV_API QvAuxinfoQueue : public QvAuQueuePoll {
 };
 
 // The stream that fills such a queue. VIDEO_AU_CODE and AUDIO_AU_CODE move as many bytes as their info says
-// from the ring into one item; statistics and stream headers are passed over; any other identifier becomes an
-// item without payload. Kernels write an access unit first and report it then.
+// from the ring into one item; statistics and stream headers are ignored; any other identifier becomes an
+// item without payload. Encoders write the bytes of an access unit before they report it.
 class QV_API QvMemOutStream : public QvBufStream {
   public:
     explicit QvMemOutStream(QvCodec* owner = nullptr);

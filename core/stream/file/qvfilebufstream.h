@@ -26,8 +26,8 @@ class QV_API QvFileBufStream : public QvBufStream {
     // Closes the file and then applies the patches, none with `abort`. May take as long as rewriting the
     // file.
     void destroy(int abort) override;
-    // Reading: throws away what is buffered. Writing: applies the patches collected so far and ends their
-    // collecting; destroy() still has to close the file.
+    // Reading: drops what is buffered. Writing: applies the patches collected so far, and collects no more;
+    // destroy() still has to close the file.
     void flush() override;
     bufstream* input() override;   // asserts a stream that is not inited; null when reading
     bufstream* output() override;  // likewise; null when writing
@@ -52,7 +52,7 @@ class QV_API QvFileBufStream : public QvBufStream {
 };
 
 // Writes "outfilename" and can go back in it and read: FILE_SEEK, FILE_MODE_READ, FILE_MODE_WRITE. Patches
-// are applied at once. Observers can be registered but hear nothing.
+// are applied at once. Observers can be registered but are never called.
 class QV_API QvFileBufStreamRwWrite : public QvFileBufStream {
   public:
     using QvFileBufStream::QvFileBufStream;

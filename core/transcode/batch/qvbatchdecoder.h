@@ -8,19 +8,20 @@
 //     while (joined.readFrame(0) == 0) use(*joined.getFramePtr(0));
 //
 // Video decides where a segment ends: sound that is longer is dropped there, and sound that is shorter is
-// filled up with silence. Without video the sound does. nrSamples() counts what the sources have, a stream's
-// "samples" what reads give. After the last segment every read gives -4 (QvStatus::endOfStream).
+// filled up with silence. Without video the sound does. nrSamples() counts the samples of the sources, a
+// stream's "samples" those that reads give. After the last segment every read returns -4
+// (QvStatus::endOfStream).
 //
-// The parameter "endedEarly" is a Vector of the names of inputs whose sound ended before they said it does;
-// what they lack was filled with silence. "clippedSamples" of an audio stream counts what its sources have
-// met beyond full scale.
+// The parameter "endedEarly" is a Vector of the names of inputs whose sound ended before its announced
+// length; the rest was filled with silence. "clippedSamples" of an audio stream counts the samples beyond
+// full scale in its sources.
 //
-// A task that is stored has the inputs in the place of this decoder: "segmentFiles" is the Vector of the
-// entries of a state's "files", each once. "segmentSources", asked with a Pair of type and stream in the
-// value, is the "sources" of that stream, and an empty Vector when asked with anything else.
+// A stored task has the inputs instead of this decoder: "segmentFiles" is the Vector of the entries of a
+// state's "files", each once. "segmentSources", asked with a Pair of type and stream in the value, is the
+// "sources" of that stream, and an empty Vector when asked with anything else.
 //
-// The decoders belong to the caller and outlive this one. They hold no file and no codec before their segment
-// is near, if they can do without (see QvDecodePipe). One thread at a time.
+// The decoders belong to the caller and outlive this one. Their streams are selected only for their segment,
+// so that they can do without file and codec before. One thread at a time.
 #pragma once
 
 #include <memory>
@@ -33,8 +34,8 @@
 
 class QV_API QvBatchDecoder : public QvDecodePipe {
   public:
-    // Streams in any order of the types; they belong to the caller and are copied. The points, if there are
-    // any, are for the streams that have none of their own.
+    // Streams in any order of the types; they belong to the caller and are copied. `points`, if valid, are
+    // for the streams without points of their own.
     struct InputSegment {
         InOutPoints points;
         QvIStreamList streams;
