@@ -1,5 +1,5 @@
-// How samples stand in the rows of each pixel format, for effects that work sample by sample whatever the
-// format, and weighted sums of rows with what is laid over them.
+// How samples lie in the rows of each pixel format, for effects that work on samples of any format, and the
+// weighted sums by which pictures are faded and covered.
 #pragma once
 
 #include <array>
@@ -41,7 +41,7 @@ struct SampleLayout {
     }
     // In a whole row of a frame; of v210 in whole groups of six pixels.
     size_t rowSamples(const QvFrame& frame, int plane) const;
-    // Of a pixel that begins a byte, and of v210 a group of six.
+    // Bytes from the start of a row to a pixel that begins at a byte; of v210 to a group of six.
     std::ptrdiff_t byteOffset(int plane, int pixel) const;
     // A row as words, and back; whole pixels, of v210 whole groups of six.
     void read(const unsigned char* from, uint16_t* words, size_t samples) const;
@@ -56,7 +56,7 @@ const SampleLayout& sampleLayout(unsigned fourcc);
 // All rows of a plane, of I422 also the lower half of the chroma.
 int sampleRows(const QvFrame& frame, int plane);
 
-// Gives `out` the format and size of `like` and leaves what it holds open. 0, or -3 with `out` empty.
+// Gives `out` the format and size of `like`, with undefined contents. 0, or -3 with `out` empty.
 int takeShape(QvFrame& out, const QvFrame& like);
 
 // All samples of a frame of the same format and size; QvFrame's own copy leaves half of the chroma of I422.
@@ -69,8 +69,8 @@ class SampleWeights {
     void resize(const SampleLayout& layout, size_t samples);
     // Sample i becomes `share` / 65536 of itself and the rest of `level`.
     void fade(size_t i, uint32_t level, uint32_t share);
-    // Sample i becomes (1 - weight / 65536) of itself, above `black`, and all of `laid`, which holds the
-    // picture laid over it as it looks over black.
+    // Sample i becomes laid + (sample - black) * (1 - weight / 65536), where `laid` is the covering picture
+    // as it looks over black.
     void cover(size_t i, uint32_t laid, uint32_t black, uint32_t weight);
     // Applies weights `first` and following to a row; `to` may be `from`.
     void apply(unsigned char* to, const unsigned char* from, size_t first, size_t samples);

@@ -44,7 +44,7 @@ class QvFramerateConvert : public QvVideoFilter {
     int restore(const AnyDict& dict) override;
 
     int write(QvFrame& frame) override;
-    // Output frames that the input frame stands for and that are still to be fetched.
+    // How many output frames of the last input frame are still to be fetched.
     int ready() const override;
     QvFrame* frame() override;
     int next() override;
@@ -73,7 +73,7 @@ class QvFramerateConvert : public QvVideoFilter {
     long long firstInput_ = -1;           // -1: no frame seen
     long long currentSource_ = -1;
     long long nextOutput_ = 0;
-    int left_ = 0;  // output frames that the held frame stands for; 0: none is held
+    int left_ = 0;  // output frames that show the held frame; 0: none is held
     bool interlacing_ = false;
     bool halfDone_ = false;  // the first frame of a pair is woven
 };

@@ -31,11 +31,11 @@ struct CropGeometry {
     static constexpr int mostPad = 16384;
 
     int inputWidth = 100, inputHeight = 100;
-    double inputAspect = 0;  // of the picture as it is shown, width to height; 0: pixels are square
+    double inputAspect = 0;  // width to height of the shown picture; 0: pixels are square
     CropMode mode = CropMode::inputAspect;
     double cropAspect = 1.0;  // likewise, of the box in mode 3
     QvRect box{0, 0, 100, 100};
-    bool placed = false;  // someone chose the box; otherwise it is as much of any input as the mode allows
+    bool placed = false;  // the box was chosen; otherwise it is the largest that the mode allows
     CropPads pads;
 
     // What a side of the box can be set to from its present corner, both inclusive.
@@ -59,9 +59,10 @@ struct CropGeometry {
     // A box that was placed is cut to what lies in the input, and is no longer placed if that is nothing.
     void setInput(int width, int height);
     void setMode(CropMode to);
-    // Any box; in modes 4 and 5 only its corner counts, if it has the size that it must have.
+    // Any box. In modes 4 and 5 a box of another size than the derived one is ignored, and only the corner
+    // used.
     void place(const QvRect& wanted);
-    // Brings the box into the shape that the mode asks for: at its corner with its width if it was placed,
+    // Gives the box the shape that the mode requires: at its corner with its width if it was placed,
     // otherwise as large as can be.
     void fit();
     void reset();  // not placed, without pads

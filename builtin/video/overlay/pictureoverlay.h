@@ -1,8 +1,8 @@
 // A picture with transparency that is laid over frames of any format.
 //
-// The picture is composed over black and converted to the frame's format once; what a frame's sample becomes
-// is then (1 - opacity) of its distance from black, added to that. As the conversion is linear this is what
-// mixing in RGB and converting would give, at the edges of the picture and in shared chroma too.
+// The picture is composed over black and converted to the frame's format once. A frame's sample then becomes
+// the converted one plus (1 - opacity) of its own distance from black. The conversion is linear, so this
+// equals mixing in RGB before it, also at the edges of the picture and in shared chroma.
 //
 //      frame
 //      +-------------------------------+
@@ -65,6 +65,6 @@ class PictureOverlay {
     const char* error_ = "";
 };
 
-// Where a picture goes: offsets from the left and top, or, when they are negative, of its right and lower
-// edges from those of the frame. -1 leaves one pixel between.
+// Where the top left corner of a picture lies. x and y are its distances from the left and top edges;
+// negative: the distances of its right and lower edges from those of the frame, -1 for one pixel.
 QvPoint qvOverlayCorner(int x, int y, int pictureWidth, int pictureHeight, const QvFrame& frame);
