@@ -12,29 +12,29 @@
 
 class Signals {
   public:
-    // What a part of a command does; each may be empty. What one throws is lost.
+    // What a part of a command does on a signal; each may be empty. Exceptions are dropped.
     struct Handlers {
         std::function<void(int)> first;  // on the first signal that stops, with its number
         // On the next one, or on the first if `first` is empty. The process then ends at once: with status 0
-        // if this answers that the work was complete, else with that of the signal.
+        // if this returns that the work was complete, else with that of the signal.
         std::function<bool()> second;
         std::function<void()> report = {};  // on SIGUSR1, as often as it comes
         // Before SIGTSTP (Ctrl-Z) stops the process, and on SIGCONT, also after another signal that stops.
         std::function<void()> suspend = {}, resume = {};
-        // What is said when the process ends at once before the work is complete; without it that no output
-        // was written, if there is a `second` to see to that. `file`: the name in it.
+        // The message if the process ends at once before the work is complete. Default: that no output was
+        // written, if there is a `second` that ensures it. `file`: the name in the message.
         std::optional<Msg> last = {};
         std::string file = {};
     };
 
-    // Blocks those of them that are not ignored in this thread and those started from now on. Make it before
+    // Blocks these signals, except ignored ones, in this thread and in those started later. To be made before
     // any other thread.
     Signals();
     ~Signals();
     Signals(const Signals&) = delete;
     Signals& operator=(const Signals&) = delete;
 
-    // While it lives, these handlers are in force, in the place of those of a Watch around it.
+    // As long as it exists, its handlers replace those of an outer Watch.
     class Watch {
       public:
         Watch(Signals& signals, Handlers handlers);
@@ -55,8 +55,8 @@ class Signals {
     // As if the user had typed Ctrl-C.
     static void interrupt();
 
-    // The result has its name, and no signal changes the status any more: the first is ignored, so that what
-    // is left to say is said, and the next one ends the process with status 0.
+    // To be called when the result has its name: no signal changes the status after that. The first is
+    // ignored, so that the last messages are printed; the next one ends the process with status 0.
     void complete();
     static bool isComplete();  // takes no lock
 

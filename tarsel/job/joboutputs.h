@@ -1,5 +1,5 @@
 // All that a job writes: its output, the task file, and the files of filters. They are checked before any
-// work, so that nothing is written over what the job reads, or twice, and get their names together.
+// work, so that no input is overwritten and no file is written twice. They get their names together.
 #pragma once
 
 #include <map>
@@ -15,7 +15,7 @@
 
 class JobOutputs {
   public:
-    // Checks the output as far as its name goes. The options have to outlive this. Throws Failure.
+    // Checks the name of the output. The options have to outlive this object. Throws Failure.
     explicit JobOutputs(const JobOptions& options);
 
     // What the output's name and the options mean.
@@ -26,22 +26,22 @@ class JobOutputs {
 
     // After claim: of all files that the job writes, in a form by which places can be compared.
     std::vector<std::string> places() const { return {places_.begin(), places_.end()}; }
-    // Null where the output is a stream or nothing.
+    // Null if the output is a stream, or if there is none.
     const Outputs* files() const { return files_.get(); }
     const StreamOutput* stream() const { return stream_.get(); }
 
-    // The name that the output has in a stored task, and the one that the engine writes to from now on; empty
-    // for no output.
+    // The name of the output in a stored task, and the one to which the engine writes after begin; "" without
+    // an output.
     std::string storedName() const;
     std::string begin();
-    // Bytes of room for the output; negative when unknown or without bounds.
+    // Free bytes for the output; negative if unknown or unlimited.
     long long freeSpace() const;
-    // The filters, writing to where their files get their names from. Devices take it as it comes.
+    // The filters with the files that they write in the hidden folder. Devices are written directly.
     FiltersState begun(FiltersState filters);
 
     bool hasTask() const { return taskFile_ || taskStream_; }
     bool taskIsStream() const { return taskStream_ != nullptr; }
-    // The engine's name for the task file, which is written there from now on.
+    // The name to which the engine writes the task file.
     std::string beginTask();
     void commitTask();
 
@@ -53,7 +53,7 @@ class JobOutputs {
     std::vector<std::string> names() const;
     // The final name of a file in the hidden folder.
     std::string finalName(const std::filesystem::path& written) const;
-    // What the engine says, with the user's names in it.
+    // A message of the engine in which the final names replace the hidden ones.
     std::string withFinalNames(std::string text) const;
 
   private:

@@ -33,12 +33,12 @@ class RunningTime {
   public:
     // `before`: seconds for which it has been running already.
     void start(double before = 0);
-    // That the job is at work; returns the seconds of the system's counter.
+    // To be called while the job works; returns the seconds of the system's counter.
     double tick();
     void pause();
     void resume();
-    // The process is about to be stopped, and was continued. If no one knew before, it was stopped from the
-    // last tick on.
+    // The process is about to be stopped; it was continued. Without a call of the first, it counts as stopped
+    // since the last tick.
     void stopping();
     void continued();
 
@@ -58,15 +58,15 @@ inline constexpr const char* kKeyHelp = "tarsel: keys: p pauses and resumes, q s
 
 class Progress {
   public:
-    // Automatic: a line when the standard error is a terminal, otherwise a log; `quiet` leaves only objects.
-    // `label` is in front; `keys`: whether the keys of a terminal work.
+    // Automatic: a line if the standard error is a terminal, otherwise a log; with `quiet` only objects are
+    // shown. `label` is in front of lines; `keys`: whether the keys of a terminal work.
     Progress(const ProgressMode& mode, bool quiet, std::string label, bool keys = true);
     ~Progress();
 
     void start() { start({0, 0, 0, 1, 1, "running"}); }
-    // Where another pass has taken `before` seconds already.
+    // The same after a pass that has taken `before` seconds.
     void start(const ProgressState& first, double before = 0);
-    // Cheap: shows something only when the last time is long enough ago.
+    // Cheap: shows something only if enough time has passed since the last time.
     void update(const ProgressState& state);
     bool due();
     // Shows it at once, except in a log.
@@ -75,10 +75,10 @@ class Progress {
     void report(const ProgressState& state);
     // A line that stays, above the one that changes. From any thread.
     void say(const std::string& line);
-    // The line goes.
+    // Removes the line that changes.
     void finish(const ProgressState& state);
     bool onTerminal() const { return line_; }
-    // What is in front from now on. On the thread that updates.
+    // A new label. On the thread that updates.
     void setLabel(std::string label) { label_ = std::move(label); }
     RunningTime& time() { return time_; }
 

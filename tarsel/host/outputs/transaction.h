@@ -1,6 +1,6 @@
-// The moment at which the files of a job get their names: all of them, or none. A job has one work folder in
-// each folder that gets files of it, and one manifest there over all of these. After a failure or a signal
-// the work folders are removed with all that they hold.
+// Gives the files of a job their names: all of them, or none. A job has one work folder in each folder to
+// which it writes, with one manifest for all files that go there. After a failure or a signal the work
+// folders are removed with all that they hold.
 #pragma once
 
 #include <atomic>
@@ -45,13 +45,13 @@ class Transaction {
 
     // The work folder of this job in `folder`, made by the first call. 0 or an errno.
     int enter(const std::string& folder, Place*& place);
-    // Gives the files of the sets of all places their names. After a failure all that was moved is back,
-    // except where it is torn: that work folder stays. Once only.
+    // Gives the files of all places their names. After a failure all that was moved is moved back, except in
+    // a place whose result is torn: its work folder stays. To be called once.
     Result commit(bool overwrite, bool sync);
     // Whether all files have their names. From any thread.
     bool placed() const { return placed_; }
-    // Removes the work folders. At any time, from any thread, more than once: while files are moved it waits
-    // for the end of that.
+    // Removes the work folders. At any time, from any thread, any number of times; waits while files are
+    // being moved.
     void discard();
 
     // The same for a process that is about to end: another thread that uses the transaction afterwards waits
@@ -62,8 +62,8 @@ class Transaction {
     static bool abandonAll();
 
   private:
-    // Who may touch the work folders. A change is one step, so that a placement and what ends the process
-    // can't both begin.
+    // Which thread may change the work folders. Changes of state are atomic, so that a placement and the end
+    // of the process can't both begin.
     enum class State : unsigned char {
         writing,
         moving,
