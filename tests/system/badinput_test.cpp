@@ -92,14 +92,6 @@ TEST_F(BadInput, TheReasonIsTheTrueOne) {
     fails(3, {"frame", "testgen", "--filter", "logo:filename=half.png", "-o", "x.png"},
           {"'half.png'", "is damaged"});
     fails(4, {"--log", "no/x.log", "info", "testgen"}, {"'no/x.log'", "no such file or folder"});
-    // A disk that is full says so in each kind of output.
-    for (const char* name : {"out.png", "out.avi", "out.raw"}) {
-        const Outcome o = runProgram(
-            {"bash", "-c",
-             "ulimit -f 2; '" + program() + "' transcode testgen:size=128x72,duration=1 -o " + name},
-            here());
-        failsAs(4, o, {std::string("'") + name + "'", "a limit of the system", "ulimit -f"}, name);
-    }
 }
 
 TEST_F(BadInput, SeveralFilesAreAllLookedAt) {

@@ -35,10 +35,15 @@ TEST_F(Options, TimesFromTheEndKeepStreamsTogether) {
 }
 
 TEST_F(Options, SizesThatMeanNothing) {
+    makeYuv("clip.yuv", 1);
+    for (const char* size : {"0x48", "64x-2", "64x100000", "x", "x-1", "-1x-1", "64x48x2", "6e1x48", ""}) {
+        fails(2,
+              {"transcode", "clip.yuv", "--raw", std::string("size=") + size + ",pixel=I420", "-o", "o.yuv"},
+              {"--raw", "size"});
+        fails(2, asYuv({"transcode", "clip.yuv", std::string("--size=") + size, "-o", "o.yuv"}), {"--size"});
+    }
     refuses({"transcode", "testgen:size=64x48", "-o", "x.raw"},
-            {{{"--size", "-1x-1"}, {"--size: '-1x-1' is not a size"}},
-             {{"--size", "10x-2"}, {"--size"}},
-             {{"--fit", "10"}, {"--fit: '10' is not a box"}},
+            {{{"--fit", "10"}, {"--fit: '10' is not a box"}},
              {{"--fit", "10x10,pad"}, {"--fit", "WxH,bars"}},
              {{"--fit", "10x60000,bars"}, {"--fit", "too far"}},
              {{"--fit", "10x60000,crop"}, {"--fit", "too far"}},

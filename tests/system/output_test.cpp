@@ -99,8 +99,6 @@ TEST_F(Output, PlacesThatTakeNone) {
         fs::permissions(folder.file("locked"), fs::perms::owner_read | fs::perms::owner_exec);
         fails(4, {"transcode", "in.wav", "-o", "locked/out.wav"}, {"may not be written"});
     }
-    fails(2, {"transcode", "in.wav", "-o", "out.mp9"}, {"'mp9'", "tarsel formats"});
-    fails(2, {"transcode", "in.wav", "-o", "out.wva"}, {"'wva'", "Did you mean 'wav'?"});
 }
 
 // The system says how far a file may grow: the write fails in the middle, as on a full disk.
@@ -110,9 +108,11 @@ TEST_F(Output, AWriteThatFailsLeavesNothing) {
     makeYuv("clip.yuv", 50);
     makeWav("long.wav", 100000);
     const auto before = listing();
-    for (const auto& job : {Words{"transcode", "long.wav", "-o", "out.wav"},
-                            asYuv({"transcode", "clip.yuv", "-o", "out.yuv"})}) {
-        failsAs(4, tarsel(job, limited), {"'out.", "a limit of the system"}, job[1]);
+    for (const auto& job :
+         {Words{"transcode", "long.wav", "-o", "out.wav"}, asYuv({"transcode", "clip.yuv", "-o", "out.yuv"}),
+          asYuv({"transcode", "clip.yuv", "-o", "out.avi"}),
+          Words{"transcode", "clip.yuv", "--raw", "size=320x480,pixel=I420", "-o", "out.png"}}) {
+        failsAs(4, tarsel(job, limited), {"'out.", "a limit of the system", "ulimit -f"}, job.back());
         EXPECT_EQ(listing(), before);
     }
     folder.write("out.wav", "precious");
@@ -127,15 +127,12 @@ TEST_F(Output, AFullDeviceIsTold) {
         fails(4, job, {"'/dev/full'", "the disk is full"});
 }
 
-TEST_F(Output, ADeviceOrAPipeTakesOneStream) {
-    works({"transcode", "in.wav", "-o", "/dev/null"});
-    const Outcome o = works({"transcode", kCard, "-o", "/dev/stdout"});
-    EXPECT_EQ(o.out.size(), 25u * 64 * 64 * 4);
+TEST_F(Output, APipeTakesOneStream) {
     mkfifo(folder.file("pipe.raw").c_str(), 0600);
     Process reader({"sh", "-c", "cat '" + folder.file("pipe.raw") + "' > '" + folder.file("copy.raw") + "'"});
     works({"transcode", kCard, "-o", "pipe.raw"});
     EXPECT_EQ(reader.finish().status, 0);
-    EXPECT_TRUE(contents("copy.raw") == o.out);
+    EXPECT_EQ(size("copy.raw"), 25 * 64 * 64 * 4);
     EXPECT_EQ(listing(), (std::set<std::string>{"copy.raw", "in.wav", "pipe.raw"}));
 }
 

@@ -62,17 +62,11 @@ TEST_F(Sound, ShorterThanThePicture) {
     }
 }
 
-// An unknown length, as a recorder leaves it, is taken for what it is; any other one that lies is not.
-TEST_F(Sound, LengthsThatLie) {
+TEST_F(Sound, ALengthThatIsNotThere) {
     const std::string data = patternBytes(4000);
-    const auto file = [&](unsigned length) {
-        return "RIFF" + leBytes(36u + length, 4) + "WAVE" + wavChunk("fmt ", wavFormat(1, 2, 44100, 16)) +
-               "data" + leBytes(length, 4) + data;
-    };
-    folder.write("open.wav", file(0xFFFFFFFF));
-    works({"transcode", "open.wav", "-o", "open_out.wav"});
-    EXPECT_TRUE(data == wavPart(contents("open_out.wav"), "data"));
-    folder.write("cut.wav", file(8000));
+    folder.write("cut.wav", "RIFF" + leBytes(36u + 8000, 4) + "WAVE" +
+                                wavChunk("fmt ", wavFormat(1, 2, 44100, 16)) + "data" + leBytes(8000, 4) +
+                                data);
     fails(3, {"transcode", "cut.wav", "-o", "out.wav"},
           {"'cut.wav'", "1000 of 2000 samples", "--accept-partial"});
     const Outcome o = works({"transcode", "cut.wav", "-o", "out.wav", "--accept-partial"});

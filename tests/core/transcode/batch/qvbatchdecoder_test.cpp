@@ -170,30 +170,7 @@ class BatchDecoder : public testing::Test {
     std::vector<std::vector<int>> heard;
 };
 
-// Two cuts of 30000/1001 with 44.1 kHz: 7 and 5 frames are 10299.. and 7357.. samples.
-TEST_F(BatchDecoder, SeamsAreExactToTheFrameAndTheSample) {
-    joined.addOutputVideoStream(picture(f29));
-    joined.addOutputAudioStream(sound(44100));
-    auto& a = source(100, f29).audio(147147, 44100);
-    auto& b = source(50, f29).audio(80000, 44100);
-    ASSERT_EQ(insert(static_cast<Source&>(a), 3, {frameTime(10, f29), frameTime(17, f29)}), 0);
-    ASSERT_EQ(insert(static_cast<Source&>(b), 3, {frameTime(3, f29), frameTime(8, f29)}), 0);
-    ASSERT_EQ(insert(static_cast<Source&>(b), 3, {frameTime(40, f29), MediaTime()}), 0);
-    ASSERT_EQ(joined.open(), 0);
-    EXPECT_EQ(joined.nrFrames(0), 7 + 5 + 10);
-    run(f29, 44100);
-    std::vector<Shown> frames;
-    for (int i = 10; i < 17; ++i) frames.push_back({1, i});
-    for (int i = 3; i < 8; ++i) frames.push_back({2, i});
-    for (int i = 40; i < 50; ++i) frames.push_back({2, i});
-    EXPECT_EQ(shown, frames);
-    // Samples up to the end of a frame, from the whole: no sum of roundings.
-    const auto due = [](int n) { return QvUtil::samplesForFrames(n, f29, 44100); };
-    std::vector<int> values = counting(frameTime(10, f29).position(44100), due(7));
-    add(values, counting(frameTime(3, f29).position(44100), due(12) - due(7)));
-    add(values, counting(frameTime(40, f29).position(44100), due(22) - due(12)));
-    EXPECT_EQ(heard[0], values);
-}
+// Seams to the sample, at rates that no whole number of samples fits, are in qvbatchtask_test.cpp.
 
 // Joins of sources with other rates, with cuts anywhere, against a model in exact integers.
 TEST_F(BatchDecoder, RandomJoinsAreWhatAModelSays) {

@@ -81,41 +81,6 @@ TEST_F(Joined, SegmentsOfDifferentFormatsComeOutAsOne) {
     task.reset();
 }
 
-// Silence that fills one segment takes nothing from the sound of the next.
-TEST_F(Joined, SoundThatEndsEarlyDoesNotShortenTheNext) {
-    addBoth(a_, short_);
-    addBoth(a_, aSound_);
-    const auto open = restore();
-    ASSERT_TRUE(open->task) << open->error;
-    EXPECT_EQ(run(*open->task), 0);
-    EXPECT_EQ(samples(written(".wav").substr(80)),
-              std::vector<int>(9600, 3000) + std::vector<int>(9600, 0) + std::vector<int>(19200, 1000));
-}
-
-TEST_F(Joined, CutsOfOneFileMeetToTheFrameAndSample) {
-    std::mt19937 random(5);
-    const AnyDict ramp = film("r.yuv", 100, 1, f25, 16, 8);
-    std::string counted;
-    for (std::uint64_t i = 0; i < 4 * 48000; ++i) counted += leBytes(i % 30011, 2);
-    const AnyDict count = entry(folder_.write("c.wav", riff(wavChunk("fmt ", wavFormat(1, 1, 48000, 16)) +
-                                                            wavChunk("data", counted))),
-                                AnyDict());
-    std::vector<int> pictures, heard;
-    for (int i = 0; i < 30; ++i) {
-        const int from = static_cast<int>(random() % 99), frames = 1 + static_cast<int>(random() % 10u);
-        const int to = std::min(from + frames, 100);
-        addBoth(ramp, count, cut(from / 25.0, to / 25.0));
-        for (int k = from; k < to; ++k) pictures.push_back(k + 1);
-        for (int k = from * 1920; k < to * 1920; ++k) heard.push_back(k % 30011);
-    }
-    const auto open = restore();
-    ASSERT_TRUE(open->task) << open->error;
-    EXPECT_EQ(open->task->batchDecoder()->nrFrames(0), static_cast<int>(pictures.size()));
-    EXPECT_EQ(run(*open->task), 0);
-    EXPECT_EQ(levels(written(".raw")), pictures);
-    EXPECT_TRUE(samples(written(".wav").substr(80)) == heard);
-}
-
 // What is stored is the inputs of the segments, and it is the same after it was restored.
 TEST_F(Joined, AJoinedTaskIsStoredWithItsSegments) {
     const AnyDict slow = film("a.yuv", 100, 1, f25, 16, 8),
@@ -199,18 +164,6 @@ TEST_F(Joined, SeamsDoNotAddUpTheirRounding) {
     const std::vector<int> got = samples(written(".wav").substr(80));
     ASSERT_EQ(got.size(), heard.size());
     for (std::size_t i = 0; i < heard.size(); ++i) ASSERT_EQ(got[i], heard[i]) << i;
-}
-
-TEST_F(Joined, SoundAloneIsAsLongAsItsSegments) {
-    state_.set("encoder", output(1, QvFramerate(0.0)));
-    add(AnyVector(source(2, aSound_, cut(0.1, 0.2))), AnyVector(Any(aSound_)));
-    add(AnyVector(source(2, short_)), AnyVector(Any(short_)));
-    add(AnyVector(source(2, aSound_, cut(0.3, 0.30625))), AnyVector(Any(aSound_)));
-    const auto open = restore();
-    ASSERT_TRUE(open->task) << open->error;
-    EXPECT_EQ(run(*open->task), 0);
-    EXPECT_EQ(samples(written(".wav").substr(80)),
-              std::vector<int>(4800, 1000) + std::vector<int>(9600, 3000) + std::vector<int>(300, 1000));
 }
 
 // Without a map both channels are mixed.
