@@ -1,4 +1,4 @@
-// What the threads of a batch processor share: the state of the run, and the requests to stop and to pause it.
+// What the threads of a batch processor share: the state of the run, and requests to stop and to pause it.
 //
 // All of it is changed under one lock; what is asked for often is also readable without. One condition wakes
 // the threads that wait for the end of a pause or of a run.

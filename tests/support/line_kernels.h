@@ -95,7 +95,7 @@ inline std::string linesBehind(const LineKernel& kernel, size_t n, size_t gap, b
         kernel.run(lines);
     }
     std::string result;
-    for (const Guarded& line : memory) result += line.intact() ? line.bytes() : "written beside the line";
+    for (const Guarded& line : memory) result += line.intact() ? line.bytes() : "written outside of the line";
     return result;
 }
 
@@ -108,7 +108,7 @@ inline void compareUnits(std::span<const LineKernel> kernels,
                 for (const bool inPlace : {false, true}) {
                     if (inPlace && !kernel.inPlace) continue;
                     const std::string expected = linesBehind(kernel, n, gap, inPlace, HWY_STATIC_TARGET);
-                    ASSERT_EQ(expected.find("written beside"), std::string::npos) << kernel.name;
+                    ASSERT_EQ(expected.find("written outside"), std::string::npos) << kernel.name;
                     ASSERT_FALSE(testing::Test::HasFailure()) << kernel.name << ' ' << n << " at " << gap;
                     for (const auto target : targets)
                         ASSERT_TRUE(linesBehind(kernel, n, gap, inPlace, target) == expected)

@@ -1,4 +1,4 @@
-// Changes of the frame rate, from a file to a file: which frames come out, and the sound beside them.
+// Changes of the frame rate, from a file to a file: which frames come out, and the sound that goes with them.
 #include "tests/system/tool.h"
 
 namespace {

@@ -251,13 +251,13 @@ TEST_F(Signal, AfterTheResultHasItsNameChangesNothing) {
     Process run({"sh", "-c", line}, here());
     while (size("out.raw") < 0) sched_yield();
     run.signal(SIGTERM);
-    std::string told;
-    for (char block[4096]; told.find("wrote 'out.raw'") == std::string::npos;) {
+    std::string reported;
+    for (char block[4096]; reported.find("wrote 'out.raw'") == std::string::npos;) {
         pollfd data{full[0], POLLIN, 0};
         ASSERT_EQ(poll(&data, 1, Process::kPatience), 1);
         const ssize_t got = read(full[0], block, sizeof block);
         ASSERT_GT(got, 0);
-        told.append(block, static_cast<size_t>(got));
+        reported.append(block, static_cast<size_t>(got));
     }
     EXPECT_EQ(run.finish().status, 0);
     close(full[0]);

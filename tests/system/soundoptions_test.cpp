@@ -120,14 +120,14 @@ TEST_F(SoundOptions, DelaysMoveTheSound) {
     EXPECT_TRUE(out({"transcode", "empty.wav", "--delay", "0.25"}).empty());
     EXPECT_TRUE(out({"transcode", "take.wav", "--delay", "0.25", "--to", "0.25"}) ==
                 late.substr(0, 24000 * 4));
-    const auto beside = [&](const char* delay) {
+    const auto delayed = [&](const char* delay) {
         works(asYuv({"transcode", "clip.yuv", "take.wav", "--delay", delay, "-o", "film.yuv", "-y"}));
         return wavPart(contents("film.wav"), "data");
     };
-    EXPECT_TRUE(beside("0.25") == late + std::string(12000 * 4, '\0'));
-    EXPECT_TRUE(beside("-0.25") == early + std::string(36000 * 4, '\0'));
-    EXPECT_TRUE(beside("0.75") == std::string(36000 * 4, '\0') + in.substr(0, 12000 * 4));
-    EXPECT_TRUE(beside("5f") == std::string(9600 * 4, '\0') + in + std::string(14400 * 4, '\0'));
+    EXPECT_TRUE(delayed("0.25") == late + std::string(12000 * 4, '\0'));
+    EXPECT_TRUE(delayed("-0.25") == early + std::string(36000 * 4, '\0'));
+    EXPECT_TRUE(delayed("0.75") == std::string(36000 * 4, '\0') + in.substr(0, 12000 * 4));
+    EXPECT_TRUE(delayed("5f") == std::string(9600 * 4, '\0') + in + std::string(14400 * 4, '\0'));
 }
 
 TEST_F(SoundOptions, GainsAndTargetsAreReached) {

@@ -28,11 +28,11 @@ class Streams : public Tool {
         return value;
     }
     // Ends with `status` without an assertion of our own about time: a run that hangs is killed.
-    void stops(Process& run, int signal, int status, const std::string& told) const {
+    void stops(Process& run, int signal, int status, const std::string& message) const {
         run.signal(signal);
         const Outcome o = run.finish();
         EXPECT_EQ(o.status, status) << o.err;
-        EXPECT_THAT(o.err, testing::HasSubstr(told));
+        EXPECT_THAT(o.err, testing::HasSubstr(message));
     }
 };
 

@@ -23,7 +23,7 @@ class Raw : public testing::Test {
         return decoder.open();
     }
     // A status with the text that goes with it.
-    std::string told(int status) { return std::to_string(status) + " " + decoder.errorDesc(); }
+    std::string outcome(int status) { return std::to_string(status) + " " + decoder.errorDesc(); }
     std::string plane(int nr = 0) {
         const QvFrame& frame = *decoder.getFramePtr(0);
         return {reinterpret_cast<const char*>(frame.plane(nr)),
@@ -56,9 +56,9 @@ TEST_F(Raw, FramesComeInOrderAndAfterSeeks) {
         EXPECT_EQ(next(i), frame(i));
     }
     for (const long long bad : {-1LL, 5LL, 1LL << 60})
-        EXPECT_EQ(told(decoder.seekToFrame(bad, 0)), "-1 Invalid seek pos");
+        EXPECT_EQ(outcome(decoder.seekToFrame(bad, 0)), "-1 Invalid seek pos");
     decoder.close();
-    EXPECT_EQ(told(decoder.readFrame(0)), "-1 stream not opened");
+    EXPECT_EQ(outcome(decoder.readFrame(0)), "-1 stream not opened");
 }
 
 TEST_F(Raw, PartsOfFramesAreToldAndNeverRead) {
@@ -117,7 +117,7 @@ TEST_F(Raw, FieldsOneAfterTheOtherAreWoven) {
 }
 
 TEST_F(Raw, SizesAndFormatsThatCanNotBeAreRefused) {
-    EXPECT_EQ(told(decoder.open()), "-1 media dec: filename not set");
+    EXPECT_EQ(outcome(decoder.open()), "-1 media dec: filename not set");
     for (const auto& [width, height] : {Pair(0, 240), {320, -1}, {100000, 100000}, {2147483647, 1}}) {
         decoder.setParam("width", width);
         decoder.setParam("height", height);
@@ -130,7 +130,7 @@ TEST_F(Raw, SizesAndFormatsThatCanNotBeAreRefused) {
         EXPECT_EQ(decoder.setParam(name, value), QvStatus::invalidParam) << name;
     set("GRAY", 4, 1);
     decoder.setParam("filename", folder.path().c_str());
-    EXPECT_EQ(told(decoder.open()), "-1 Can not open file");
+    EXPECT_EQ(outcome(decoder.open()), "-1 Can not open file");
 }
 
 TEST_F(Raw, SettingsAreStored) {

@@ -19,7 +19,7 @@ struct EncodePipeTest : testing::Test {
         return stored;
     }
     // A status with the text that goes with it.
-    std::string told(int status) { return std::to_string(status) + " " + pipe_->errorDesc(); }
+    std::string outcome(int status) { return std::to_string(status) + " " + pipe_->errorDesc(); }
 
     FailingOutputs outputs_;
     std::unique_ptr<QvEncodePipe> pipe_{QvEncodePipe::create()};
@@ -62,11 +62,11 @@ TEST_F(EncodePipeTest, WhatCanNotBeIsToldAndChangesNothing) {
          "'rawmux'"},
         {[&] { return pipe().applyPreset(0x2010001, 0); }, "-13 Invalid preset #33619969"},
     };
-    for (const auto& [act, text] : refused) EXPECT_EQ(told(act()), text);
+    for (const auto& [act, text] : refused) EXPECT_EQ(outcome(act()), text);
     EXPECT_LT(pipe().addVideoStream(AnyDict("codec", wrong)), 0) << "settings that can't be";
     EXPECT_EQ(state(), before);
     outputs_.params = AnyDict("rawmux.maxStreams", AnyDict("vids", 1, "auds", 1, "subs", 0, "total", 9));
-    EXPECT_EQ(told(pipe().addVideoStream("rawvenc")),
+    EXPECT_EQ(outcome(pipe().addVideoStream("rawvenc")),
               "-6 No (more) video streams allowed with currentlyselected preset / muxer.");
     EXPECT_EQ(pipe().addAudioStream("rawaenc"), QvStatus::noStream);
 }
@@ -210,7 +210,7 @@ TEST_F(EncodePipeTest, UserPresets) {
     EXPECT_EQ(pipe().addVideoStream(Any()), 1);
     EXPECT_EQ(get("video1/width"), Any(160)) << "a further stream starts like the preset's last one";
 
-    EXPECT_TRUE(told(pipe().applyPreset(QvPreset(0x2010001, "gone"), 0))
+    EXPECT_TRUE(outcome(pipe().applyPreset(QvPreset(0x2010001, "gone"), 0))
                     .starts_with("-13 Cannot apply preset 'gone', base profile "));
 
     FiltersState filters;

@@ -206,7 +206,7 @@ TEST_F(VideoChain, TellsTheEncoderWhatIsLeftToDo) {
         Rate in, out;
         int canDeinterlace;
         const char* filter;
-        int told, warnings;  // told -1: nothing
+        int reported, warnings;  // -1: nothing
     } rows[] = {
         {i50, p25, 1, nullptr, 1, 0}, {i50, p25, 1, "deinterlace", 0, 0},  {i50, p25, 1, "bobber", 0, 0},
         {i50, i50, 1, nullptr, 0, 0}, {i50, p25, 0, nullptr, -1, 1},       {p25, p25, 0, nullptr, -1, 0},
@@ -219,7 +219,7 @@ TEST_F(VideoChain, TellsTheEncoderWhatIsLeftToDo) {
         FakeEncodePipe encoder(row.out);
         encoder.video.params.set("canDeinterlace", row.canDeinterlace);
         const AnyDict params = adjusted(row.in, row.out, pipeOf(row.filter).get(), encoder);
-        EXPECT_EQ(params.getInt32("deinterlaceVideo", -1), row.told);
+        EXPECT_EQ(params.getInt32("deinterlaceVideo", -1), row.reported);
         EXPECT_EQ(log.count(warning, QvLogMask::warning), row.warnings);
     }
     const Pipe pipe = pipeOf("cropper");
@@ -235,8 +235,8 @@ TEST_F(VideoChain, TellsTheEncoderWhatIsLeftToDo) {
 
 struct ViewsPipe : QvVf {
     using QvVf::QvVf;
-    int setParam(const char* name, const Any& value) override { return told.set(name, value), 0; }
-    AnyDict told;
+    int setParam(const char* name, const Any& value) override { return reported.set(name, value), 0; }
+    AnyDict reported;
 };
 
 TEST_F(VideoChain, PicturesOfSeveralViewsHaveAPipeOfTheirOwn) {
@@ -244,7 +244,7 @@ TEST_F(VideoChain, PicturesOfSeveralViewsHaveAPipeOfTheirOwn) {
     Job job(720, 576, p25, 704, 576, p25);
     EXPECT_FALSE(dynamic_cast<ViewsPipe*>(Pipe(QvProcessUtil::createVideoPipeMV(job, 1)).get()));
     const Pipe pipe(QvProcessUtil::createVideoPipeMV(job, 2));
-    EXPECT_EQ(dynamic_cast<ViewsPipe&>(*pipe).told,
+    EXPECT_EQ(dynamic_cast<ViewsPipe&>(*pipe).reported,
               AnyDict("nrViews", 2, "jobDescription", Any(static_cast<const void*>(&job))));
     EXPECT_EQ(pipe->filter(0)->getState(), 3);
     job.with("customFilters", AnyVector(Any(stored("logo", AnyDict("refuseOpen", -1)))));

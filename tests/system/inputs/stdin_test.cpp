@@ -50,8 +50,8 @@ TEST_F(StandardInput, IsReadLikeAFile) {
         {"cat clip.yuv | tarsel transcode - a.wav --input-format i420 --raw size=64x48,rate=25 --to 0.1 -o "
          "two.yuv",
          "two.yuv", ""},
-        {"cat a.wav | tarsel transcode clip.yuv -" + raw + " --input-format wav --to 0.12 -o beside.yuv",
-         "beside.yuv", "clip.yuv"},
+        {"cat a.wav | tarsel transcode clip.yuv -" + raw + " --input-format wav --to 0.12 -o both.yuv",
+         "both.yuv", "clip.yuv"},
         {"cat a.wav | tarsel transcode - --input-format wav -o - --format wav > through.wav", "through.wav",
          "a.wav"},
         // Read twice.

@@ -8,7 +8,7 @@
 namespace {
 
 // What is reported in 8 rounds of half a second each, as "round:percent".
-std::string told(const AnyDict& settings, int total, double offset = 0, double scale = 1) {
+std::string reported(const AnyDict& settings, int total, double offset = 0, double scale = 1) {
     QvProgressReport report(settings, total, 4.0);
     report.setPass(offset, scale);
     std::string all;
@@ -39,14 +39,14 @@ TEST(QvProgressReport, EachKeyHasItsOwnPace) {
         {AnyDict("absoluteTime", 1), 8, "0:13 2:38 4:63 6:88"},
     };
     for (const auto& row : rows)
-        EXPECT_EQ(told(row.settings, row.total), row.expected)
+        EXPECT_EQ(reported(row.settings, row.total), row.expected)
             << (row.settings.empty() ? "" : row.settings.getKey(0)) << " of " << row.total;
 }
 
 TEST(QvProgressReport, TwoPassesShareTheWhole) {
     const AnyDict frames("frames", 4);
-    EXPECT_EQ(told(frames, 8, 0, 0.5), "0:0 4:25");
-    EXPECT_EQ(told(frames, 8, 0.5, 0.5), "0:50 4:75");
+    EXPECT_EQ(reported(frames, 8, 0, 0.5), "0:0 4:25");
+    EXPECT_EQ(reported(frames, 8, 0.5, 0.5), "0:50 4:75");
 }
 
 }  // namespace

@@ -38,15 +38,15 @@ TEST(RunControl, APauseHoldsOnlyARunWithAWorker) {
     RunControl control;
     control.begin();
     control.pause();
-    int told = 0;
-    control.waitWhilePaused([&](bool) { ++told; });
-    EXPECT_EQ(told, 0) << "on the caller's own thread nobody could end it";
+    int reported = 0;
+    control.waitWhilePaused([&](bool) { ++reported; });
+    EXPECT_EQ(reported, 0) << "on the caller's own thread nobody could end it";
     control.synchronous = false;
     control.waitWhilePaused([&](bool paused) {
-        ++told;
+        ++reported;
         if (paused) control.resume();
     });
-    EXPECT_EQ(told, 2);
+    EXPECT_EQ(reported, 2);
     control.pause();
     control.askForStop(false);
     EXPECT_FALSE(control.paused()) << "a stop ends it";

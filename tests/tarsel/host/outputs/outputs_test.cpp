@@ -90,7 +90,7 @@ const Job kJobs[] = {
      {{"c0.yuv", "0"}, {"c2.yuv", "2"}, {"c2.wav", "2"}, {"c2.png", "b"}, {"cx.yuv", "b"}},
      {{"out#00.raw", "n0"}, {"out#01.raw", "n1"}, {"out.wav", "s"}},
      {{"c0.yuv", "n0"}, {"c1.yuv", "n1"}, {"c0.wav", "s"}, {"c2.png", "b"}, {"cx.yuv", "b"}}},
-    {"frames beside a sound that is not theirs",
+    {"frames next to a sound that is not theirs",
      "a.yuv",
      "raw",
      {{"a.yuv", "old"}, {"a.wav", "s"}},
