@@ -44,6 +44,8 @@ TEST_F(Views, AreJoinedByALayoutAndTranscoded) {
     EXPECT_TRUE(contents("right.yuv") == contents("elsewhere/b.yuv"));
     works({"views", "--view", "testgen:size=64x48,duration=1,views=2", "-o", "z.mvf"});
     EXPECT_THAT(works({"info", "z.mvf"}).out, HasSubstr("2 views"));
+    const Outcome one = works({"transcode", "z.mvf", "-o", "one.yuv"});
+    EXPECT_THAT(one.err, HasSubstr("excess views will be ignored"));
     // A task of views runs as they do.
     works({"transcode", "y.mvf", "-o", "task.yuv", "--save-task", "task.xml"});
     EXPECT_THAT(works({"info", "task.xml"}).out, HasSubstr("task"));
