@@ -96,6 +96,13 @@ TEST_F(Cards, AClipIsAnInputByItsFolder) {
     writeP2Clip(folder.path() / "short", {.name = "A", .samples = {}, .duration = 7});
     fails(3, coded({"transcode", "short", "-o", "short.gray"}), {"5 of 7 frames"});
     works(coded({"transcode", "short", "-o", "short.gray", "--accept-partial"}));
+    // A mix that names the folder.
+    folder.write(
+        "card.mmf",
+        "<Metafile><AudioInterleave><channels><ch pos='L'><src file='card' stream='1' channel='0'/></ch>"
+        "</channels><decoders><dec file='card' decoder='p2dec'/></decoders></AudioInterleave></Metafile>");
+    works(coded({"transcode", "card.mmf", "-o", "mixed.wav"}));
+    EXPECT_GT(size("mixed.wav"), 3 * 9600);
     fails(3, {"--no-plugins", "info", "card"}, {"there is no decoder for MXF files here"});
     fails(3, {"transcode", "card/CONTENTS/CLIP/A.XML", "-o", "x.wav"}, {"A.MXF"});
     writeP2Clip(folder.path() / "card", {.name = "B"});
