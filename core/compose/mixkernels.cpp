@@ -37,19 +37,21 @@ HWY_INLINE V WeightedLanes(V x, V coefficient) {
                        hn::BitCast(lanes, hn::ShiftRight<16>(even)));
 }
 
-// Returns how many samples it has done.
+// Returns how many samples it has done. `start`: nothing is in the sums yet.
+template <bool start>
 size_t AddVectors(int32_t* sum, const int32_t* from, size_t count, int64_t coefficient) {
     const Lanes lanes;
     const size_t step = hn::Lanes(lanes);
+    const auto add = [&](size_t at, auto values) HWY_ATTR {
+        if constexpr (!start) values = hn::Add(hn::LoadU(lanes, sum + at), values);
+        hn::StoreU(values, lanes, sum + at);
+    };
     size_t i = 0;
     if (coefficient == 65536) {
-        for (; i + step <= count; i += step)
-            hn::StoreU(hn::Add(hn::LoadU(lanes, sum + i), hn::LoadU(lanes, from + i)), lanes, sum + i);
+        for (; i + step <= count; i += step) add(i, hn::LoadU(lanes, from + i));
     } else if (coefficient == static_cast<int32_t>(coefficient)) {
         const auto factor = hn::Set(lanes, static_cast<int32_t>(coefficient));
-        for (; i + step <= count; i += step)
-            hn::StoreU(hn::Add(hn::LoadU(lanes, sum + i), WeightedLanes(hn::LoadU(lanes, from + i), factor)),
-                       lanes, sum + i);
+        for (; i + step <= count; i += step) add(i, WeightedLanes(hn::LoadU(lanes, from + i), factor));
     }
     return i;
 }
@@ -88,14 +90,23 @@ size_t InterleaveTwo(int32_t* to, const int32_t* rows, size_t length, size_t cou
 
 #else
 
-constexpr auto AddVectors = [](auto&&...) -> size_t { return 0; };
-constexpr auto InterleaveFour = AddVectors, InterleaveTwo = AddVectors;
+template <bool start>
+size_t AddVectors(int32_t*, const int32_t*, size_t, int64_t) {
+    return 0;
+}
+constexpr auto InterleaveFour = [](auto&&...) -> size_t { return 0; };
+constexpr auto InterleaveTwo = InterleaveFour;
 
 #endif
 
 void AddWeighted(int32_t* sum, const int32_t* from, size_t step, size_t count, int64_t coefficient) {
-    size_t i = step == 1 ? AddVectors(sum, from, count, coefficient) : 0;
+    size_t i = step == 1 ? AddVectors<false>(sum, from, count, coefficient) : 0;
     for (; i < count; ++i) sum[i] = wrapAdd(sum[i], weighted(from[i * step], coefficient));
+}
+
+void SetWeighted(int32_t* sum, const int32_t* from, size_t step, size_t count, int64_t coefficient) {
+    size_t i = step == 1 ? AddVectors<true>(sum, from, count, coefficient) : 0;
+    for (; i < count; ++i) sum[i] = weighted(from[i * step], coefficient);
 }
 
 void Interleave(int32_t* to, size_t step, const int32_t* rows, size_t length, int nrRows, size_t count) {
@@ -121,11 +132,17 @@ HWY_AFTER_NAMESPACE();
 namespace qvmix {
 
 HWY_EXPORT(AddWeighted);
+HWY_EXPORT(SetWeighted);
 HWY_EXPORT(Interleave);
 
 void addWeighted(std::int32_t* sum, const std::int32_t* from, std::size_t step, std::size_t count,
                  std::int64_t coefficient) {
     HWY_DYNAMIC_DISPATCH(AddWeighted)(sum, from, step, count, coefficient);
+}
+
+void setWeighted(std::int32_t* sum, const std::int32_t* from, std::size_t step, std::size_t count,
+                 std::int64_t coefficient) {
+    HWY_DYNAMIC_DISPATCH(SetWeighted)(sum, from, step, count, coefficient);
 }
 
 void interleave(std::int32_t* to, std::size_t step, const std::int32_t* rows, std::size_t length, int nrRows,

@@ -95,6 +95,7 @@ double QvAudioMix::weight(int out, int stream, int channel) const {
 // The sums of one output channel, of samples `from` on.
 void QvAudioMix::_sumOutput(int out, int from, int samples, const TPtrList<QvPcm>& in,
                             std::int32_t* sums) const {
+    bool started = false;
     for (int stream = 0; stream < in.size(); ++stream) {
         const int first = firstChannel_[_pair(out, stream)];
         if (first == nothingUsed) continue;
@@ -102,10 +103,14 @@ void QvAudioMix::_sumOutput(int out, int from, int samples, const TPtrList<QvPcm
         const std::int64_t* weights = &coefficients_[_pair(out, stream) * sizeOf(maxChannels_)];
         // A weight of 0 adds nothing.
         for (int channel = first; channel < usedChannels_[sizeOf(stream)]; ++channel)
-            if (weights[channel] != 0)
-                qvmix::addWeighted(sums, valuesOf(pcm, from) + channel, sizeOf(pcm.channels()),
-                                   sizeOf(samples), weights[channel]);
+            if (weights[channel] != 0) {
+                const auto add = started ? qvmix::addWeighted : qvmix::setWeighted;
+                add(sums, valuesOf(pcm, from) + channel, sizeOf(pcm.channels()), sizeOf(samples),
+                    weights[channel]);
+                started = true;
+            }
     }
+    if (!started) std::fill_n(sums, samples, 0);
 }
 
 int QvAudioMix::mixChannels(int samples, QvPcm& out, const TPtrList<QvPcm>& in) const {
@@ -125,7 +130,6 @@ int QvAudioMix::mixChannels(int samples, QvPcm& out, const TPtrList<QvPcm>& in) 
         auto* to = reinterpret_cast<std::int32_t*>(out.ptr(from));
         for (int first = 0; first < nrOutChannels_; first += rowsAtOnce) {
             const int channels = std::min(rowsAtOnce, nrOutChannels_ - first);
-            std::fill_n(rows, channels * block, 0);
             for (int channel = 0; channel < channels; ++channel)
                 _sumOutput(first + channel, from, count, in, rows + channel * block);
             qvmix::interleave(to + first, sizeOf(nrOutChannels_), rows, block, channels, sizeOf(count));

@@ -131,7 +131,7 @@ int JobRun::start(JobTranscoder& transcoder) {
         parts_.pipe->setFilename(Any(name.c_str()));
     options_.measuredFor < 0 ? progress_.start()
                              : progress_.start({.part = 0.5, .pass = 2, .passes = 2}, options_.measuredFor);
-    qv_log()->clear();
+    addEngineWarnings();  // of joining the streams
     stopIfSignalled();
     const int result = transcoder.transcode(false);
     // So it stays only where no worker could be started.
@@ -144,9 +144,13 @@ int JobRun::start(JobTranscoder& transcoder) {
     });
 }
 
+void JobRun::addEngineWarnings() {
+    warnings_.addEngine([this](const std::string& text) { return parts_.outputs.withFinalNames(text); });
+}
+
 void JobRun::checkAndCommit() {
     lengths_.check(!plan_.output.isStream());
-    warnings_.addEngine([this](const std::string& text) { return parts_.outputs.withFinalNames(text); });
+    addEngineWarnings();
     if (const std::string lost = Events::get().lost(); !lost.empty()) warnings_.add(lost);
     if (endedEarly_) {
         const std::string& name = plan_.input(*endedEarly_).name;

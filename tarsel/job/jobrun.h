@@ -26,6 +26,7 @@ class JobRun {
     void drive(JobTranscoder& transcoder);
     int start(JobTranscoder& transcoder);
     void addClipped(const std::vector<long long>& clipped);
+    void addEngineWarnings();
     void checkAndCommit();
     void report(const std::vector<std::string>& names) const;
     void stopIfSignalled() const;

@@ -211,7 +211,10 @@ std::shared_ptr<const OutputPreset> ownOutput(const OutputWish& wish, const Pres
 std::shared_ptr<const OutputPreset> namedPreset(const OutputWish& wish, const PresetExtension* row) {
     const QvPreset preset = findPreset(wish.preset);
     std::string muxer = wish.muxer;
-    for (const std::string& own : muxersOf(wish, preset.isBuiltin() ? row : nullptr))
+    // A user's preset was kept for a multiplexer, but the output is what its name says.
+    const Any kept = preset.isCustom() ? preset.defaultMuxer() : Any();
+    const bool fits = row && kept.isText() && (kept == row->muxer || kept == row->otherMuxer);
+    for (const std::string& own : muxersOf(wish, fits ? nullptr : row))
         if (muxer.empty() && preset.muxerAllowed(own.c_str())) muxer = own;
     const std::string writer = muxer.empty() ? preset.defaultMuxer().toString().asString("") : muxer;
     ChosenEncoders encoders;

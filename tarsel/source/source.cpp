@@ -415,7 +415,8 @@ std::string Source::damage() const {
             const bool video = type == 1;
             const long long present = video ? open_->nrFrames(i) : open_->nrSamples(i);
             const long long expected = params.getInt64(video ? "framesExpected" : "samplesExpected", present);
-            if (video && !params.isSet("samplesExpected") && expected == present + 1)
+            // Others lack whole frames.
+            if (video && decoderName() == "rawdec" && expected == present + 1)
                 return "it ends in the middle of frame " + std::to_string(expected) + ", after " +
                        std::to_string(present) + " whole ones";
             return "it ends after " + std::to_string(present) + " of " + std::to_string(expected) +

@@ -106,8 +106,10 @@ int Interleave::chooseRate(int targetRate) const {
 }
 
 int Interleave::selectStreams(int rate) {
-    for (const auto& decoder : decoders_) {
-        const Any file = decoder->QvCodec::getParam("filename");
+    for (std::size_t i = 0; i < decoders_.size(); ++i) {
+        QvDecodePipe* const decoder = decoders_[i].get();
+        // As the set-up names it: a decoder may have found another file by it.
+        const Any file = setup.inFileName(static_cast<int>(i));
         for (const Any& stream : setup.getFileActiveStreams(file)) {
             const int number = stream.asInt32();
             if (number < 0 || number >= decoder->nrStreams(qvAudioStream)) {
@@ -117,7 +119,7 @@ int Interleave::selectStreams(int rate) {
                 qv_log()->error("%s", text.asString());
                 return QvStatus::failed;
             }
-            auto input = std::make_unique<ADecStream>(decoder.get(), number, file);
+            auto input = std::make_unique<ADecStream>(decoder, number, file);
             std::string reason;
             if (const int result = input->prepare(rate, setup.filters(file, number), reason)) {
                 inputFailure_ =

@@ -121,7 +121,11 @@ int PresetApplier::addPresetStreams(const QvPreset& preset) {
     std::vector<int> types;
     for (const auto& entry : preset.getVector("streams"))
         if (entry.isDict()) types.push_back(entry.asDict().getInt32("type", -1));
-    if (types.empty()) types = {qvVideoStream, qvAudioStream};
+    if (types.empty()) {
+        types = {qvVideoStream, qvAudioStream};
+        // As of a built-in preset.
+        std::erase_if(types, [this](int type) { return preset_.codecs(type).empty(); });
+    }
     int over = 0;
     int failed = 0;
     for (const int type : types) {

@@ -144,6 +144,15 @@ TEST_F(Preset, StreamsOfAnOlderFormKeepTheirSettings) {
     EXPECT_EQ(pipe->videoEncoder(0)->getParam("width"), 320);
 }
 
+TEST_F(Preset, WithoutStreamsTheyGetThoseThatTheMultiplexerTakes) {
+    for (const char* name : {"h264venc", "mp4mux"}) modules.add(name);
+    qvPresetMgr()->update();
+    const std::unique_ptr<QvEncodePipe> pipe(QvEncodePipe::create());
+    ASSERT_EQ(pipe->applyPreset(QvPreset(qvSymToProfile("H264_HIGH"), "loose"), 0), 0) << pipe->errorDesc();
+    EXPECT_STREQ(pipe->getMuxer()->name(), "mp4mux");
+    EXPECT_EQ(pipe->nrVideoStreams() * 10 + pipe->nrAudioStreams(), 10) << "MP4 takes no PCM";
+}
+
 TEST_F(Preset, ToNoneReleasesItsProfileEverywhere) {
     QvPreset preset = whole();
     preset.checkValid();

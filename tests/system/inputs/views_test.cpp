@@ -44,6 +44,8 @@ TEST_F(Views, AreJoinedByALayoutAndTranscoded) {
     EXPECT_TRUE(contents("right.yuv") == contents("elsewhere/b.yuv"));
     works({"views", "--view", "testgen:size=64x48,duration=1,views=2", "-o", "z.mvf"});
     EXPECT_THAT(works({"info", "z.mvf"}).out, HasSubstr("2 views"));
+    const Outcome one = works({"transcode", "z.mvf", "-o", "one.yuv"});
+    EXPECT_THAT(one.err, HasSubstr("excess views will be ignored"));
     // A task of views runs as they do.
     works({"transcode", "y.mvf", "-o", "task.yuv", "--save-task", "task.xml"});
     EXPECT_THAT(works({"info", "task.xml"}).out, HasSubstr("task"));
@@ -63,7 +65,7 @@ TEST_F(Views, WhatCanNotBeShownIsRefused) {
           {"its size is 64x64, not 64x48"});
     folder.write("b.yuv", patternBytes(3 * kFrame));
     works(asYuv({"views", "--view", "a.yuv", "--view", "b.yuv", "-o", "short.mmf"}));
-    EXPECT_EQ(tarsel({"transcode", "short.mmf", "-o", "x.yuv"}).status, 3) << "a view is longer";
+    fails(3, {"transcode", "short.mmf", "-o", "x.yuv"}, {"3 of 4 frames"});
     EXPECT_EQ(tarsel({"transcode", "x.mmf", "-o", "a.yuv", "-y"}).status, 3);
 }
 
@@ -94,6 +96,13 @@ TEST_F(Cards, AClipIsAnInputByItsFolder) {
     writeP2Clip(folder.path() / "short", {.name = "A", .samples = {}, .duration = 7});
     fails(3, coded({"transcode", "short", "-o", "short.gray"}), {"5 of 7 frames"});
     works(coded({"transcode", "short", "-o", "short.gray", "--accept-partial"}));
+    // A mix that names the folder.
+    folder.write(
+        "card.mmf",
+        "<Metafile><AudioInterleave><channels><ch pos='L'><src file='card' stream='1' channel='0'/></ch>"
+        "</channels><decoders><dec file='card' decoder='p2dec'/></decoders></AudioInterleave></Metafile>");
+    works(coded({"transcode", "card.mmf", "-o", "mixed.wav"}));
+    EXPECT_GT(size("mixed.wav"), 3 * 9600);
     fails(3, {"--no-plugins", "info", "card"}, {"there is no decoder for MXF files here"});
     fails(3, {"transcode", "card/CONTENTS/CLIP/A.XML", "-o", "x.wav"}, {"A.MXF"});
     writeP2Clip(folder.path() / "card", {.name = "B"});
