@@ -129,7 +129,9 @@ void BatchRunner::start(Entry& entry) {
 }
 
 void BatchRunner::startChild(Entry& entry) {
-    std::vector<std::string> words = options_.command;
+    std::vector<std::string> words;
+    if (!options_.log.empty()) words = {"--log", options_.log + "." + entry.task.id};
+    words.insert(words.end(), options_.command.begin(), options_.command.end());
     words.push_back(std::to_string(entry.task.number));
     ++entry.result.attempts;
     entry.result.start = secondsSince1970();
@@ -183,7 +185,9 @@ void BatchRunner::limit(Entry& entry) {
 void BatchRunner::collect(Entry& entry) {
     std::unique_ptr<ChildTask> child;
     BatchTaskResult& result = entry.result;
-    result.status = entry.child->process().wait();
+    const int ended = entry.child->process().wait();
+    const bool killed = ended < 0;
+    result.status = killed ? kSignalStatus - ended : ended;
     {
         const std::lock_guard guard(lock_);
         child = std::move(entry.child);
@@ -196,7 +200,6 @@ void BatchRunner::collect(Entry& entry) {
         result.written = child->outputs();
         return end(entry, TaskEnd::done);
     }
-    const bool killed = result.status > kSignalStatus && child->failure().empty();
     if (killed) tidyAfter(entry.task, options_.policy);
     if (stopping_) return end(entry, TaskEnd::stopped);
     const std::string& output = entry.task.output;
@@ -204,8 +207,7 @@ void BatchRunner::collect(Entry& entry) {
     if (entry.timedOut)
         line = lineOf(Msg::batchTaskTimeout, {output, options_.timeoutText});
     else if (killed)
-        line = lineOf(Msg::batchTaskKilled,
-                      {output, std::to_string(result.status - kSignalStatus), entry.task.id});
+        line = lineOf(Msg::batchTaskKilled, {output, std::to_string(-ended), entry.task.id});
     else if (line.empty())
         line = lineOf(Msg::batchTaskFailed, {output, std::to_string(result.status), entry.task.id});
     if (result.attempts > options_.retries) return fail(entry, result.status, line);
