@@ -9,6 +9,7 @@
 #include "tarsel/host/events.h"
 #include "tarsel/host/keyboard.h"
 #include "tarsel/host/outputs/recordfile.h"
+#include "tarsel/host/taskevent.h"
 #include "tarsel/words/messages.h"
 #include "tarsel/words/timespec.h"
 
@@ -226,6 +227,10 @@ void BatchRunner::end(Entry& entry, TaskEnd how) {
     entry.ended = true;
     entry.result.end = how;
     endedWeight_ += entry.weight;
+    report(entry, how == TaskEnd::done      ? "done"
+                  : how == TaskEnd::already ? "already"
+                  : how == TaskEnd::failed  ? "failed"
+                                            : "stopped");
     if (how == TaskEnd::stopped || (options_.quiet && how != TaskEnd::failed)) return;
     std::string line = "task " + std::to_string(entry.task.number) + " of " + std::to_string(entries_.size());
     if (how == TaskEnd::failed) return say(line + " failed: " + entry.result.failure);
@@ -264,10 +269,47 @@ void BatchRunner::show() {
         state.frame += entry.child->frames();
         state.outSeconds += entry.child->outSeconds();
     }
+    if (progress_.due())
+        for (const Entry& entry : entries_)
+            if (entry.child) report(entry, paused_ ? "paused" : "running");
     state.part = wholeWeight_ > 0 ? weight / wholeWeight_ : 1;
     state.state = paused_ ? "paused" : "running";
     progress_.setLabel(std::to_string(ended) + " of " + std::to_string(entries_.size()) + " tasks  ");
     progress_.update(state);
+}
+
+// Of a task that is at work, or of one that has ended.
+void BatchRunner::report(const Entry& entry, const char* state) const {
+    if (options_.progress.how != ProgressMode::How::json) return;
+    const BatchTaskResult& result = entry.result;
+    TaskEvent event;
+    event.number = entry.task.number;
+    event.count = static_cast<int>(entries_.size());
+    event.id = result.id;
+    event.attempt = result.attempts;
+    JobFigures& figures = event.figures;
+    figures.state = state;
+    if (entry.child) {
+        const ChildTask& child = *entry.child;
+        figures.percent = child.part() * 100;
+        figures.frame = child.frames();
+        figures.outMicroseconds = static_cast<long long>(child.outSeconds() * 1e6);
+        figures.speed = child.speed();
+        figures.elapsedSeconds = entry.child->time().seconds();
+        if (child.part() > 0) figures.etaSeconds = figures.elapsedSeconds * (1 - child.part()) / child.part();
+        if (figures.elapsedSeconds > 0)
+            figures.fps = static_cast<double>(child.frames()) / figures.elapsedSeconds;
+    } else {
+        const bool made = result.end == TaskEnd::done || result.end == TaskEnd::already;
+        figures.percent = made ? 100 : -1;
+        figures.etaSeconds = made ? 0 : -1;
+        figures.speed = result.speed;
+        figures.elapsedSeconds = result.seconds;
+        event.status = made ? 0 : std::max(result.status, 1);
+        event.failure = result.failure;
+        event.outputs = result.written;
+    }
+    tellTask(event);
 }
 
 // --- Signals and keys, on threads of their own.

@@ -58,6 +58,7 @@ class BatchRunner {
     void end(Entry& entry, TaskEnd how);
     void fail(Entry& entry, int status, const std::string& line);
     void show();
+    void report(const Entry& entry, const char* state) const;
     void say(const std::string& line);
     void stopAll();
     bool endAtOnce();
