@@ -3,9 +3,9 @@
 //   killat REPORT N COMMAND [ARGUMENT...]
 //
 // Between two such calls the files on the disk are the same, so a kill before each of them is a kill at every
-// moment that makes a difference. A child of the program that makes the call is killed with it. With N = 0 nothing is killed. With KILLAT_ALL set every system call counts.
-// The calls that counted are written to REPORT, a line "NUMBER NAME" each. The exit status is the program's,
-// or 128 + the signal.
+// moment that makes a difference. A child of the program that makes the call is killed with it. With N = 0
+// nothing is killed. With KILLAT_ALL set every system call counts. The calls that counted are written to
+// REPORT, a line "NUMBER NAME" each. The exit status is the program's, or 128 + the signal.
 #include <fcntl.h>
 #include <sys/ptrace.h>
 #include <sys/syscall.h>
