@@ -6,6 +6,8 @@
 #include <filesystem>
 #include <string_view>
 
+#include <qvplugcore/qvplugcore.h>
+
 #include "tarsel/host/childprocess.h"
 #include "tarsel/host/clocktext.h"
 #include "tarsel/host/files.h"
