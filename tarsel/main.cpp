@@ -10,6 +10,7 @@
 
 #include "tarsel/commands/commands.h"
 #include "tarsel/commands/progressoption.h"
+#include "tarsel/host/childprocess.h"
 #include "tarsel/host/console.h"
 #include "tarsel/host/events.h"
 #include "tarsel/host/files.h"
@@ -100,12 +101,7 @@ int run(int argc, char** argv) {
     addRun(line, signals, version);
     addWatch(line, signals, version);
     addTask(line, signals);
-    addBatch(line, signals, version, {argv, argv + argc}, [&] {
-        std::vector<std::string> before;
-        if (!plugins.empty()) before.insert(before.end(), {"--plugins", plugins});
-        if (allowUnsafePlugins) before.emplace_back("--allow-unsafe-plugins");
-        return before;
-    });
+    addBatch(line, signals, version, {argv, argv + argc}, log);
     addInfo(line);
     addLoudness(line);
     addMix(line, signals);
@@ -128,6 +124,11 @@ int run(int argc, char** argv) {
     if (parsed.prepare) parsed.prepare();
     if (log == "stderr" && Events::get().descriptor() == 2)
         throw failure(Msg::optionsExclude, {"--log stderr", "--progress json"});
+    std::vector<std::string> common;
+    if (!plugins.empty()) common.insert(common.end(), {"--plugins", plugins});
+    if (noPlugins) common.emplace_back("--no-plugins");
+    if (allowUnsafePlugins) common.emplace_back("--allow-unsafe-plugins");
+    ChildProcess::passOn(common);
     Engine engine(log, plugins, !noPlugins, allowUnsafePlugins);
     parsed.action();
     flushOutput();

@@ -97,7 +97,7 @@ int QvWatchProcessor::nameOutput(QvEncodePipe& pipe, const QvWatchTask& task, in
     return pipe.setFilename(task.outputFilename(target, nameToMake(inputFile), extension.asString("")));
 }
 
-// What is thrown fails one target alone.
+// What is thrown fails one target alone; the next one still starts at the beginning.
 int QvWatchProcessor::_tryTarget(QvDecodePipe& decoder, const QvWatchTask& task, int target,
                                  const Any& inputFile, std::vector<std::string>& outputs) {
     try {
@@ -105,6 +105,10 @@ int QvWatchProcessor::_tryTarget(QvDecodePipe& decoder, const QvWatchTask& task,
     } catch (...) {
         const FailureText failure = qvCurrentFailure();
         qv_log()->error("    Transcoding error: %s", failure.text);
+        try {
+            if (target + 1 < task.nrTargets()) rewind(decoder);
+        } catch (...) {  // the next target meets it again
+        }
         return failure.code;
     }
 }

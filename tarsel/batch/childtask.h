@@ -10,9 +10,10 @@
 
 class ChildTask {
   public:
-    // `words`: a command of the tool that sends objects (see docs/progress.schema.json) to its standard
-    // error. `task`: see handedTask. Throws Failure.
-    ChildTask(const std::vector<std::string>& words, const Descriptor& task) : process_(words, task) {
+    // `words`: arguments of the tool with which it sends objects (see docs/progress.schema.json) to its
+    // standard error. `task`: see handedTask. Throws Failure.
+    ChildTask(const std::vector<std::string>& words, const Descriptor& task)
+        : process_(words, ChildProcess::Stream::error, task.get()) {
         time_.start();
     }
 

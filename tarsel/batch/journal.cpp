@@ -21,40 +21,10 @@ constexpr std::pair<Step, const char*> kSteps[] = {
     {Step::failed, "failed"},
 };
 
-constexpr char kHex[] = "0123456789abcdef";
-
-// Names of files may have any bytes, JSON only texts: what is not plain ASCII is "%c3", as is '%' itself.
-std::string escaped(const std::string& name) {
-    std::string text;
-    for (const char c : name) {
-        const auto byte = static_cast<unsigned char>(c);
-        if (byte > 0x20 && byte < 0x7F && c != '%')
-            text += c;
-        else
-            text += {'%', kHex[byte >> 4], kHex[byte & 15]};
-    }
-    return text;
-}
-
-int digitOf(char c) {
-    const char* const found = std::find(kHex, kHex + 16, c);
-    return found == kHex + 16 ? 0 : static_cast<int>(found - kHex);
-}
-
-std::string unescaped(const std::string& text) {
-    std::string name;
-    for (size_t i = 0; i < text.size(); ++i) {
-        const bool escape = text[i] == '%' && i + 2 < text.size();
-        name += escape ? static_cast<char>(digitOf(text[i + 1]) * 16 + digitOf(text[i + 2])) : text[i];
-        if (escape) i += 2;
-    }
-    return name;
-}
-
 Json rowsOf(const std::vector<RecordedFile>& files) {
     Json rows = Json::array();
     for (const RecordedFile& file : files)
-        rows.push_back({{"name", escaped(file.name)},
+        rows.push_back({{"name", escapedBytes(file.name)},
                         {"bytes", file.stamp.bytes},
                         {"changed", file.stamp.changed},
                         {"digest", file.digest}});
@@ -79,7 +49,7 @@ std::vector<RecordedFile> filesOf(const Json& object) {
     if (rows == object.end() || !rows->is_array()) return files;
     for (const Json& row : *rows)
         if (row.is_object())
-            files.push_back({unescaped(valueOf<std::string>(row, "name", "")),
+            files.push_back({unescapedBytes(valueOf<std::string>(row, "name", "")),
                              {valueOf<long long>(row, "bytes", -1), valueOf<long long>(row, "changed", -1)},
                              valueOf<std::string>(row, "digest", "")});
     return files;

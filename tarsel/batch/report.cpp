@@ -6,9 +6,11 @@
 #include <filesystem>
 #include <string_view>
 
+#include <qvplugcore/qvplugcore.h>
+
+#include "tarsel/host/childprocess.h"
 #include "tarsel/host/clocktext.h"
 #include "tarsel/host/files.h"
-#include "tarsel/host/follow/toolprocess.h"
 #include "tarsel/words/failure.h"
 #include "tarsel/words/json.h"
 #include "tarsel/words/messages.h"
@@ -19,6 +21,7 @@ namespace {
 constexpr int kMostPictures = 500;
 // A picture that is larger is none that the tool made.
 constexpr size_t kMostBytes = 1 << 20;
+constexpr double kPatience = 30;  // seconds for a picture
 
 struct EndRow {
     TaskEnd end;
@@ -200,13 +203,16 @@ bool isPng(const std::string& bytes) {
 
 // The options of a task may draw over a picture; this is the one that the file itself has.
 std::string pictureIn(const std::string& file) {
-    ToolProcess process;
-    process.start({"frame", file, "--at", "0", "--size", "200x-1", "-o", "-"}, ToolProcess::Stream::output);
+    ChildProcess process({"frame", file, "--at", "0", "--size", "200x-1", "-o", "-"},
+                         ChildProcess::Stream::output);
+    const double end = QvTimer::absoluteTime() + kPatience;
     std::string png;
     while (png.size() <= kMostBytes && process.read(png)) {
+        const double left = end - QvTimer::absoluteTime();
+        if (left <= 0) return "";  // the process is ended with its object
+        waitForAny({{process.descriptor()}}, static_cast<int>(left * 1000) + 1);
     }
-    if (png.size() > kMostBytes) process.stop();
-    return process.wait() == 0 && isPng(png) ? png : "";
+    return png.size() <= kMostBytes && process.wait() == 0 && isPng(png) ? png : "";
 }
 
 }  // namespace

@@ -9,6 +9,7 @@
 #include "tarsel/host/events.h"
 #include "tarsel/host/keyboard.h"
 #include "tarsel/host/outputs/recordfile.h"
+#include "tarsel/host/taskevent.h"
 #include "tarsel/words/messages.h"
 #include "tarsel/words/timespec.h"
 
@@ -129,7 +130,9 @@ void BatchRunner::start(Entry& entry) {
 }
 
 void BatchRunner::startChild(Entry& entry) {
-    std::vector<std::string> words = options_.command;
+    std::vector<std::string> words;
+    if (!options_.log.empty()) words = {"--log", options_.log + "." + entry.task.id};
+    words.insert(words.end(), options_.command.begin(), options_.command.end());
     words.push_back(std::to_string(entry.task.number));
     ++entry.result.attempts;
     entry.result.start = secondsSince1970();
@@ -183,7 +186,9 @@ void BatchRunner::limit(Entry& entry) {
 void BatchRunner::collect(Entry& entry) {
     std::unique_ptr<ChildTask> child;
     BatchTaskResult& result = entry.result;
-    result.status = entry.child->process().wait();
+    const int ended = entry.child->process().wait();
+    const bool killed = ended < 0;
+    result.status = killed ? kSignalStatus - ended : ended;
     {
         const std::lock_guard guard(lock_);
         child = std::move(entry.child);
@@ -196,7 +201,6 @@ void BatchRunner::collect(Entry& entry) {
         result.written = child->outputs();
         return end(entry, TaskEnd::done);
     }
-    const bool killed = result.status > kSignalStatus && child->failure().empty();
     if (killed) tidyAfter(entry.task, options_.policy);
     if (stopping_) return end(entry, TaskEnd::stopped);
     const std::string& output = entry.task.output;
@@ -204,8 +208,7 @@ void BatchRunner::collect(Entry& entry) {
     if (entry.timedOut)
         line = lineOf(Msg::batchTaskTimeout, {output, options_.timeoutText});
     else if (killed)
-        line = lineOf(Msg::batchTaskKilled,
-                      {output, std::to_string(result.status - kSignalStatus), entry.task.id});
+        line = lineOf(Msg::batchTaskKilled, {output, std::to_string(-ended), entry.task.id});
     else if (line.empty())
         line = lineOf(Msg::batchTaskFailed, {output, std::to_string(result.status), entry.task.id});
     if (result.attempts > options_.retries) return fail(entry, result.status, line);
@@ -224,6 +227,10 @@ void BatchRunner::end(Entry& entry, TaskEnd how) {
     entry.ended = true;
     entry.result.end = how;
     endedWeight_ += entry.weight;
+    report(entry, how == TaskEnd::done      ? "done"
+                  : how == TaskEnd::already ? "already"
+                  : how == TaskEnd::failed  ? "failed"
+                                            : "stopped");
     if (how == TaskEnd::stopped || (options_.quiet && how != TaskEnd::failed)) return;
     std::string line = "task " + std::to_string(entry.task.number) + " of " + std::to_string(entries_.size());
     if (how == TaskEnd::failed) return say(line + " failed: " + entry.result.failure);
@@ -262,10 +269,47 @@ void BatchRunner::show() {
         state.frame += entry.child->frames();
         state.outSeconds += entry.child->outSeconds();
     }
+    if (progress_.due())
+        for (const Entry& entry : entries_)
+            if (entry.child) report(entry, paused_ ? "paused" : "running");
     state.part = wholeWeight_ > 0 ? weight / wholeWeight_ : 1;
     state.state = paused_ ? "paused" : "running";
     progress_.setLabel(std::to_string(ended) + " of " + std::to_string(entries_.size()) + " tasks  ");
     progress_.update(state);
+}
+
+// Of a task that is at work, or of one that has ended.
+void BatchRunner::report(const Entry& entry, const char* state) const {
+    if (options_.progress.how != ProgressMode::How::json) return;
+    const BatchTaskResult& result = entry.result;
+    TaskEvent event;
+    event.number = entry.task.number;
+    event.count = static_cast<int>(entries_.size());
+    event.id = result.id;
+    event.attempt = result.attempts;
+    JobFigures& figures = event.figures;
+    figures.state = state;
+    if (entry.child) {
+        const ChildTask& child = *entry.child;
+        figures.percent = child.part() * 100;
+        figures.frame = child.frames();
+        figures.outMicroseconds = static_cast<long long>(child.outSeconds() * 1e6);
+        figures.speed = child.speed();
+        figures.elapsedSeconds = entry.child->time().seconds();
+        if (child.part() > 0) figures.etaSeconds = figures.elapsedSeconds * (1 - child.part()) / child.part();
+        if (figures.elapsedSeconds > 0)
+            figures.fps = static_cast<double>(child.frames()) / figures.elapsedSeconds;
+    } else {
+        const bool made = result.end == TaskEnd::done || result.end == TaskEnd::already;
+        figures.percent = made ? 100 : -1;
+        figures.etaSeconds = made ? 0 : -1;
+        figures.speed = result.speed;
+        figures.elapsedSeconds = result.seconds;
+        event.status = made ? 0 : std::max(result.status, 1);
+        event.failure = result.failure;
+        event.outputs = result.written;
+    }
+    tellTask(event);
 }
 
 // --- Signals and keys, on threads of their own.

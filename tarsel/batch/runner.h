@@ -25,7 +25,8 @@ struct BatchOptions {
     bool quiet = false;
     ProgressMode progress;
     OutputPolicy policy{false};
-    // The command line of a task's process, to which its number is added.
+    std::string log;  // absolute; a task's process logs to this name with "." and the task's; "" for nowhere
+    // The arguments of a task's process, to which its number is added.
     std::vector<std::string> command;
 };
 
@@ -57,6 +58,7 @@ class BatchRunner {
     void end(Entry& entry, TaskEnd how);
     void fail(Entry& entry, int status, const std::string& line);
     void show();
+    void report(const Entry& entry, const char* state) const;
     void say(const std::string& line);
     void stopAll();
     bool endAtOnce();

@@ -219,7 +219,7 @@ class Check {
 }  // namespace
 
 void addBatch(CommandLine& line, Signals& signals, const std::string& version,
-              const std::vector<std::string>& words, std::function<std::vector<std::string>()> before) {
+              const std::vector<std::string>& words, const std::string& log) {
     Command batch = line.command("batch", "Keep a LIST of tasks and run them");
     const auto name = std::make_shared<std::string>();
     batch.argument("LIST", *name, "A list of tasks (XML)");
@@ -259,5 +259,5 @@ void addBatch(CommandLine& line, Signals& signals, const std::string& version,
     Command checking = batch.command("check", "Check whether the tasks can be run");
     checking.action([name] { Check(BatchFile(*name)).run(); });
     showing("status", "Show what was done and what is left", status);
-    addBatchRun(batch, signals, name, version, std::move(before));
+    addBatchRun(batch, signals, name, version, log);
 }

@@ -17,7 +17,7 @@ using ListName = std::shared_ptr<const std::string>;
 void addBatchAdd(Command& batch, Signals& signals, const ListName& list,
                  const std::vector<std::string>& words);
 void addBatchRun(Command& batch, Signals& signals, const ListName& list, const std::string& version,
-                 std::function<std::vector<std::string>()> before);
+                 const std::string& log);
 
 // Makes the words of a job that was added before it could be planned its options. What `job` says of how it
 // is run stays. Throws Failure.

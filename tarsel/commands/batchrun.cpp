@@ -12,6 +12,7 @@
 #include "tarsel/commands/progressoption.h"
 #include "tarsel/host/childprocess.h"
 #include "tarsel/host/events.h"
+#include "tarsel/host/files.h"
 #include "tarsel/host/signals.h"
 #include "tarsel/words/commandline.h"
 #include "tarsel/words/messages.h"
@@ -73,10 +74,8 @@ int numberOf(const std::string& text, int otherwise, int low, int high, const ch
     return text.empty() ? otherwise : static_cast<int>(parseNumber(text, low, high, option));
 }
 
-Words commandOf(const Given& given, const BatchFile& file, const Words& before, int jobs) {
-    Words words = {ownProgram()};
-    words.insert(words.end(), before.begin(), before.end());
-    words.insert(words.end(), {"batch", file.name(), "run", "--progress", "json"});
+Words commandOf(const Given& given, const BatchFile& file, int jobs) {
+    Words words = {"batch", file.name(), "run", "--progress", "json"};
     const struct {
         bool on;
         const char* option;
@@ -97,7 +96,7 @@ Words commandOf(const Given& given, const BatchFile& file, const Words& before, 
     return words;
 }
 
-void runAll(const Given& given, const BatchFile& file, const Words& before, Signals& signals) {
+void runAll(const Given& given, const BatchFile& file, const std::string& log, Signals& signals) {
     BatchOptions options;
     options.jobs = numberOf(given.jobs, 1, 1, kMostJobs, "--jobs");
     options.retries = numberOf(given.retries, 0, 0, kMostRetries, "--retry");
@@ -108,7 +107,8 @@ void runAll(const Given& given, const BatchFile& file, const Words& before, Sign
     options.quiet = given.quiet;
     options.progress = given.progress.mode;
     options.policy = given.outputs.policy();
-    options.command = commandOf(given, file, before, options.jobs);
+    options.command = commandOf(given, file, options.jobs);
+    if (!log.empty() && log != "stderr") options.log = absoluteName(log);
     std::optional<ReportFile> report;
     if (!given.report.empty()) report.emplace(given.report, Words{file.name()}, options.policy);
     const BatchResult result = BatchRunner(file, options, signals).run();
@@ -135,7 +135,7 @@ void runAll(const Given& given, const BatchFile& file, const Words& before, Sign
 }  // namespace
 
 void addBatchRun(Command& batch, Signals& signals, const ListName& list, const std::string& version,
-                 std::function<std::vector<std::string>()> before) {
+                 const std::string& log) {
     Command command = batch.command("run", "Run the tasks that are not done");
     const auto given = std::make_shared<Given>();
     command.option("--jobs", given->jobs, "So many tasks at a time (1)", "N");
@@ -155,9 +155,9 @@ void addBatchRun(Command& batch, Signals& signals, const ListName& list, const s
     given->outputs.add(command);
     command.flag("-q,--quiet", given->quiet, "Print nothing but errors");
     command.action(
-        [&signals, list, given, before] {
+        [&signals, &log, list, given] {
             const BatchFile file(*list);
-            if (given->tasks.empty() && given->handed.empty()) return runAll(*given, file, before(), signals);
+            if (given->tasks.empty() && given->handed.empty()) return runAll(*given, file, log, signals);
             for (const auto& [value, name] : {std::pair{&given->jobs, "--jobs"},
                                               {&given->retries, "--retry"},
                                               {&given->timeout, "--timeout"},

@@ -20,10 +20,9 @@ void addFormats(CommandLine& line);
 void addPresets(CommandLine& line, Signals& signals);
 void addRecover(CommandLine& line);
 void addRun(CommandLine& line, Signals& signals, const std::string& version);
-// `words`: the whole command line; `before` gives those of it that stand before the command, for other runs
-// of the tool.
+// `words`: the whole command line; `log`: of --log, once it is parsed; it outlives the line.
 void addBatch(CommandLine& line, Signals& signals, const std::string& version,
-              const std::vector<std::string>& words, std::function<std::vector<std::string>()> before);
+              const std::vector<std::string>& words, const std::string& log);
 void addTask(CommandLine& line, Signals& signals);
 void addCompare(CommandLine& line, Signals& signals);
 void addScope(CommandLine& line, Signals& signals);

@@ -1,8 +1,8 @@
 #include "tarsel/host/childprocess.h"
 
 #include <cerrno>
-#include <climits>
 #include <csignal>
+#include <utility>
 
 #include <fcntl.h>
 #include <poll.h>
@@ -16,53 +16,93 @@
 
 namespace {
 
+// By this name it is the file of this process even when another one has taken its place, as in an upgrade.
+constexpr const char* kOwnProgram = "/proc/self/exe";
+
+static_assert(ChildProcess::kKilled == -SIGKILL);
+
+// What the child gets in the place of what this process has.
+struct Inherited {
+    int captured, stream, handed, nowhere;
+    pid_t parent;
+};
+
+bool giveHanded(int handed) {
+    if (handed < 0) return true;
+    return handed == ChildProcess::kHanded ? fcntl(handed, F_SETFD, 0) == 0
+                                           : dup2(handed, ChildProcess::kHanded) >= 0;
+}
+
 // Between fork and exec nothing but calls that need no lock and no memory.
-[[noreturn]] void becomeProgram(char* const* words, int output, int nowhere, int handed, pid_t parent) {
+[[noreturn]] void becomeTool(char* const* words, const Inherited& own) {
     prctl(PR_SET_PDEATHSIG, SIGKILL);
-    if (getppid() != parent) _exit(127);  // it has ended before that was set
+    if (getppid() != own.parent) _exit(127);  // it has ended before that was set
     setpgid(0, 0);
-    for (const int number : {SIGPIPE, SIGXFSZ}) ::signal(number, SIG_DFL);
+    for (const int ignored : {SIGPIPE, SIGXFSZ, SIGIO, SIGTERM}) ::signal(ignored, SIG_DFL);
     sigset_t none;
     sigemptyset(&none);
     pthread_sigmask(SIG_SETMASK, &none, nullptr);
-    if (dup2(nowhere, STDIN_FILENO) < 0 || dup2(output, STDOUT_FILENO) < 0 || dup2(output, STDERR_FILENO) < 0)
-        _exit(127);
-    if (handed == ChildProcess::kHanded ? fcntl(handed, F_SETFD, 0) != 0
-                                        : dup2(handed, ChildProcess::kHanded) < 0)
-        _exit(127);
-    execv(words[0], words);
+    for (int stream = 0; stream <= STDERR_FILENO; ++stream)
+        if (dup2(stream == own.stream ? own.captured : own.nowhere, stream) < 0) _exit(127);
+    if (!giveHanded(own.handed)) _exit(127);
+    execv(kOwnProgram, words);
     _exit(127);
 }
 
+int waitFor(pid_t process) {
+    int status = 0;
+    pid_t ended;
+    do ended = waitpid(process, &status, 0);
+    while (ended < 0 && errno == EINTR);
+    return ended < 0 ? 127 : WIFSIGNALED(status) ? -WTERMSIG(status) : WEXITSTATUS(status);
+}
+
+std::vector<std::string>& passedOn() {
+    static std::vector<std::string> arguments;
+    return arguments;
+}
+
+[[noreturn]] void refuse(int error) { throw systemFailure(Msg::childNotStarted, "tarsel", error); }
+
 }  // namespace
 
-ChildProcess::ChildProcess(const std::vector<std::string>& words, const Descriptor& handed) {
-    std::vector<char*> arguments;
-    for (const std::string& word : words) arguments.push_back(const_cast<char*>(word.c_str()));
-    arguments.push_back(nullptr);
-    const Descriptor nowhere(open("/dev/null", O_RDONLY | O_CLOEXEC));
+void ChildProcess::passOn(std::vector<std::string> arguments) { passedOn() = std::move(arguments); }
+
+ChildProcess::ChildProcess(const std::vector<std::string>& arguments, Stream captured, int handed) {
+    std::vector<char*> words = {const_cast<char*>("tarsel")};
+    for (const auto* some : {&std::as_const(passedOn()), &arguments})
+        for (const std::string& one : *some) words.push_back(const_cast<char*>(one.c_str()));
+    words.push_back(nullptr);
+    const Descriptor nowhere(open("/dev/null", O_RDWR | O_CLOEXEC));
     int ends[2];
-    if (!nowhere || pipe2(ends, O_CLOEXEC) != 0) throw systemFailure(Msg::childNotStarted, words[0], errno);
-    output_.reset(ends[0]);
+    if (!nowhere || pipe2(ends, O_CLOEXEC) != 0) refuse(errno);
+    stream_.reset(ends[0]);
     const Descriptor writing(ends[1]);
-    const pid_t self = getpid();
+    const int stream = captured == Stream::output ? STDOUT_FILENO : STDERR_FILENO;
+    const Inherited own{writing.get(), stream, handed, nowhere.get(), getpid()};
     pid_ = fork();
-    if (pid_ == 0) becomeProgram(arguments.data(), writing.get(), nowhere.get(), handed.get(), self);
-    if (pid_ < 0) throw systemFailure(Msg::childNotStarted, words[0], errno);
+    if (pid_ == 0) becomeTool(words.data(), own);
+    if (pid_ < 0) refuse(errno);
     setpgid(pid_, pid_);  // whichever of both is first
     handle_.reset(static_cast<int>(syscall(SYS_pidfd_open, pid_, 0)));
-    fcntl(output_.get(), F_SETFL, O_NONBLOCK);
+    if (!handle_) {
+        const int error = errno;
+        ::kill(pid_, SIGKILL);
+        waitFor(pid_);
+        refuse(error);
+    }
+    fcntl(stream_.get(), F_SETFL, O_NONBLOCK);
 }
 
 ChildProcess::~ChildProcess() {
-    if (status_ >= 0) return;
-    ::kill(pid_, SIGKILL);
+    if (ended_) return;
+    kill();
     wait();
 }
 
 bool ChildProcess::read(std::string& to) {
-    for (char block[4096];;) {
-        const ssize_t got = ::read(output_.get(), block, sizeof block);
+    for (char block[16384];;) {
+        const ssize_t got = ::read(stream_.get(), block, sizeof block);
         if (got > 0)
             to.append(block, static_cast<size_t>(got));
         else if (got == 0 || errno != EINTR)
@@ -71,22 +111,18 @@ bool ChildProcess::read(std::string& to) {
 }
 
 int ChildProcess::wait() {
-    int status = 0;
-    pid_t ended;
-    do ended = waitpid(pid_, &status, 0);
-    while (ended < 0 && errno == EINTR);
-    status_ = ended < 0 ? 127 : WIFSIGNALED(status) ? 128 + WTERMSIG(status) : WEXITSTATUS(status);
-    return status_;
+    ended_ = true;
+    return waitFor(pid_);
 }
 
 bool ChildProcess::endsWithin(int milliseconds) const {
     pollfd end{handle_.get(), POLLIN, 0};
-    return handle_ && poll(&end, 1, milliseconds) > 0;
+    return poll(&end, 1, milliseconds) > 0;
 }
 
 // By its handle, as the number may be another process's once it was waited for.
 void ChildProcess::signal(int number) const {
-    if (handle_) syscall(SYS_pidfd_send_signal, handle_.get(), number, nullptr, 0);
+    syscall(SYS_pidfd_send_signal, handle_.get(), number, nullptr, 0);
 }
 
 void ChildProcess::askToEnd() const {
@@ -125,9 +161,3 @@ Descriptor fileInMemory() {
 }
 
 std::string nameOfDescriptor(int descriptor) { return "/proc/self/fd/" + std::to_string(descriptor); }
-
-std::string ownProgram() {
-    char name[PATH_MAX];
-    const ssize_t length = readlink("/proc/self/exe", name, sizeof name);
-    return length > 0 ? std::string(name, static_cast<size_t>(length)) : "/proc/self/exe";
-}

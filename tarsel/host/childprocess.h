@@ -1,7 +1,7 @@
-// A program that this one starts and that ends with it, whatever ends it.
+// Runs of this tool as processes of their own, so that what a hostile file does to one ends it alone. They
+// end with this process, whatever ends that.
 #pragma once
 
-#include <chrono>
 #include <span>
 #include <string>
 #include <vector>
@@ -10,26 +10,30 @@
 
 #include "tarsel/host/descriptor.h"
 
-// In a process group of its own, so that the keys of a terminal don't reach it. It reads
-// nothing, and all that it writes to its standard streams comes back here. The thread that starts it has to
-// live as long as it.
+// In a process group of its own, so that the keys of a terminal don't reach it. It reads nothing; what it
+// writes to one of its standard streams comes back here, and the other leads nowhere. The thread that starts
+// it has to live as long as it.
 class ChildProcess {
   public:
+    enum class Stream { output, error };
     static constexpr int kHanded = 3;
+    static constexpr int kKilled = -9;  // of wait(): it was ended by force, as where memory is short
 
-    // words[0] is the file to run. `handed` becomes its descriptor kHanded. Throws Failure if there is no
-    // room for another process.
-    ChildProcess(const std::vector<std::string>& words, const Descriptor& handed);
+    // What all of them get in front of their arguments. Once, before the first.
+    static void passOn(std::vector<std::string> arguments);
+    // `arguments`: those of the tool. `handed`: an open descriptor that becomes its descriptor kHanded, or
+    // -1. Throws Failure if there is no room for another process.
+    ChildProcess(const std::vector<std::string>& arguments, Stream captured, int handed = -1);
     // Kills it if it has not ended.
     ~ChildProcess();
     ChildProcess(const ChildProcess&) = delete;
     ChildProcess& operator=(const ChildProcess&) = delete;
 
     // For waitForAny: there is something to read.
-    int descriptor() const { return output_.get(); }
+    int descriptor() const { return stream_.get(); }
     // Appends what there is without waiting for more. False at the end of it.
     bool read(std::string& to);
-    // Waits for its end: the exit status, or 128 plus the number of the signal that ended it.
+    // Waits for its end: the exit status, or minus the number of the signal that ended it.
     int wait();
     // Whether it has ended after so many milliseconds at most. From any thread.
     bool endsWithin(int milliseconds) const;
@@ -43,8 +47,8 @@ class ChildProcess {
     void signal(int number) const;
 
     pid_t pid_ = -1;
-    Descriptor output_, handle_;
-    int status_ = -1;
+    Descriptor stream_, handle_;
+    bool ended_ = false;
 };
 
 // Wakes a thread that is in waitForAny.
@@ -66,6 +70,3 @@ void waitForAny(std::span<const int> descriptors, int milliseconds);
 Descriptor fileInMemory();
 // By which it can be opened.
 std::string nameOfDescriptor(int descriptor);
-
-// The program that is running, as a file.
-std::string ownProgram();

@@ -15,6 +15,7 @@
 #include <unistd.h>
 
 #include "tarsel/host/files.h"
+#include "tarsel/host/taskevent.h"
 #include "tarsel/host/terminal.h"
 #include "tarsel/words/failure.h"
 #include "tarsel/words/json.h"
@@ -277,6 +278,23 @@ void tell(Level level, const std::string& line) {
     object["event"] = "message";
     object["level"] = level == Level::warning ? "warning" : "note";
     object["text"] = line;
+    send(c, object);
+}
+
+void tellTask(const TaskEvent& task) {
+    Channel& c = channel();
+    if (!Events::get().isOpen()) return;
+    const std::lock_guard guard(c.lock);
+    const bool ended = task.status >= 0;
+    if (c.ended || (!ended && !hasRoom(c.handle, 0))) return;
+    Json object = objectOf("task", task.figures);
+    object["task"] = task.number;
+    object["tasks"] = task.count;
+    object["id"] = task.id;
+    object["attempt"] = task.attempt;
+    object["status"] = ended ? Json(task.status) : Json(nullptr);
+    object["error"] = task.failure.empty() ? Json(nullptr) : Json(task.failure);
+    object["outputs"] = task.outputs;
     send(c, object);
 }
 

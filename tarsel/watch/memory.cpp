@@ -1,49 +1,23 @@
 #include "tarsel/watch/memory.h"
 
 #include <array>
-#include <cstdio>
-#include <cstdlib>
 #include <string_view>
 
 #include "tarsel/words/json.h"
+#include "tarsel/words/messages.h"
 
 namespace {
 
 // In the order of State.
 constexpr std::array<std::string_view, 4> kStates = {"begun", "done", "closed", "failed"};
 
-// Names are bytes, and JSON is UTF-8: other bytes than those of plain ASCII become "%XX".
-std::string coded(const std::string& name) {
-    std::string text;
-    for (const char c : name) {
-        if (c > ' ' && c < '\x7f' && c != '%') {
-            text += c;
-            continue;
-        }
-        char digits[4];
-        std::snprintf(digits, sizeof digits, "%%%02x", static_cast<unsigned>(static_cast<unsigned char>(c)));
-        text += digits;
-    }
-    return text;
+Json jsonOf(const MadeFile& made) {
+    return Json::array({escapedBytes(made.name), made.bytes, made.modified});
 }
-
-std::string decoded(const std::string& text) {
-    std::string name;
-    for (size_t at = 0; at < text.size(); ++at) {
-        if (text[at] != '%' || at + 2 >= text.size()) {
-            name += text[at];
-            continue;
-        }
-        name += static_cast<char>(std::strtoul(text.substr(at + 1, 2).c_str(), nullptr, 16));
-        at += 2;
-    }
-    return name;
-}
-
-Json jsonOf(const MadeFile& made) { return Json::array({coded(made.name), made.bytes, made.modified}); }
 
 MadeFile madeFileOf(const Json& json) {
-    return {decoded(json.at(0).get<std::string>()), json.at(1).get<long long>(), json.at(2).get<long long>()};
+    return {unescapedBytes(json.at(0).get<std::string>()), json.at(1).get<long long>(),
+            json.at(2).get<long long>()};
 }
 
 WatchedFile fileOf(const Json& json) {
@@ -57,9 +31,10 @@ WatchedFile fileOf(const Json& json) {
     for (size_t i = 0; i < kStates.size(); ++i)
         if (kStates[i] == state) file.state = static_cast<WatchedFile::State>(i);
     for (const auto& [label, all] : json.at("made").items())
-        for (const Json& made : all) file.made[decoded(label)].push_back(madeFileOf(made));
-    for (const Json& output : json.at("outputs")) file.outputs.push_back(decoded(output.get<std::string>()));
-    file.name = decoded(json.at("name").get<std::string>());
+        for (const Json& made : all) file.made[unescapedBytes(label)].push_back(madeFileOf(made));
+    for (const Json& output : json.at("outputs"))
+        file.outputs.push_back(unescapedBytes(output.get<std::string>()));
+    file.name = unescapedBytes(json.at("name").get<std::string>());
     return file;
 }
 
@@ -77,7 +52,7 @@ bool WatchedFile::isCertainly(const FileFacts& now) const {
 
 std::string lineOf(const WatchedFile& file) {
     Json json = Json::object();
-    json["name"] = coded(file.name);
+    json["name"] = escapedBytes(file.name);
     json["state"] = kStates[static_cast<size_t>(file.state)];
     json["digest"] = file.digest;
     json["bytes"] = file.facts.bytes;
@@ -85,11 +60,11 @@ std::string lineOf(const WatchedFile& file) {
     json["inode"] = file.facts.inode;
     Json& targets = json["made"] = Json::object();
     for (const auto& [label, all] : file.made) {
-        Json& target = targets[coded(label)] = Json::array();
+        Json& target = targets[escapedBytes(label)] = Json::array();
         for (const MadeFile& made : all) target.push_back(jsonOf(made));
     }
     Json& outputs = json["outputs"] = Json::array();
-    for (const std::string& output : file.outputs) outputs.push_back(coded(output));
+    for (const std::string& output : file.outputs) outputs.push_back(escapedBytes(output));
     return json.dump();
 }
 
@@ -102,6 +77,7 @@ WatchedFile watchedFileOf(const std::string& line) {
 }
 
 WatchMemory::WatchMemory(const std::string& file) : lines_(file) {
+    if (!lines_.tryLock()) throw failure(Msg::watchTwice, {file});
     const std::vector<std::string> lines = lines_.lines();
     for (const std::string& line : lines)
         if (const WatchedFile known = watchedFileOf(line); !known.name.empty()) take(known);
@@ -124,7 +100,7 @@ const WatchedFile* WatchMemory::find(const std::string& name) const {
 }
 
 void WatchMemory::remember(const WatchedFile& file) {
-    lines_.add(lineOf(file));
+    lines_.append(lineOf(file), true);
     take(file);
 }
 

@@ -6,7 +6,7 @@
 #include <vector>
 
 #include "tarsel/host/follow/filefacts.h"
-#include "tarsel/host/follow/lockedlines.h"
+#include "tarsel/host/outputs/recordfile.h"
 
 // A file that a run has written, as it left it.
 struct MadeFile {
@@ -39,7 +39,7 @@ WatchedFile watchedFileOf(const std::string& line);
 
 class WatchMemory {
   public:
-    // Throws Failure.
+    // Throws Failure, also while another process has the file.
     explicit WatchMemory(const std::string& file);
 
     const WatchedFile* find(const std::string& name) const;
@@ -51,7 +51,7 @@ class WatchMemory {
   private:
     void take(const WatchedFile& file);
 
-    LockedLines lines_;
+    RecordFile lines_;
     std::map<std::string, WatchedFile> files_;
     std::map<std::string, std::string> makers_;  // by output
 };

@@ -52,7 +52,7 @@ void takeObject(const std::string& line, ToolResult& result,
 // While it lives, signals reach the process.
 class ToolRun::Running {
   public:
-    Running(ToolRun& run, ToolProcess& process) : run_(run) {
+    Running(ToolRun& run, ChildProcess& process) : run_(run) {
         const std::lock_guard guard(run_.lock_);
         run_.running_ = &process;
     }
@@ -67,24 +67,25 @@ class ToolRun::Running {
     ToolRun& run_;
 };
 
-ToolResult ToolRun::run(const std::vector<std::string>& arguments, ToolProcess::Stream stream,
+ToolResult ToolRun::run(const std::vector<std::string>& arguments, ChildProcess::Stream stream,
                         const std::function<void(std::string&)>& got) {
-    ToolProcess process;
-    process.start(arguments, stream);
+    ChildProcess process(arguments, stream);
     const Running running(*this, process);
     // A stop that came before could not reach it.
     bool stopping = false;
     std::string text;
     for (bool open = true; open;) {
         const std::array<int, 2> descriptors = {process.descriptor(), other_};
-        if (wake_.stopped() && !stopping) process.stop();
+        if (wake_.stopped() && !stopping) process.askToEnd();
         stopping = stopping || wake_.stopped();
-        if (!stopping) wake_.wait(descriptors, -1);
-        if (!stopping) arrived_();
-        if (stopping || process.hasSomething()) {
-            open = process.read(text);
-            got(text);
+        if (stopping) {
+            waitForAny({descriptors.data(), 1}, -1);
+        } else {
+            wake_.wait(descriptors, -1);
+            arrived_();
         }
+        open = process.read(text);
+        got(text);
     }
     ToolResult result;
     result.status = process.wait();
@@ -93,7 +94,7 @@ ToolResult ToolRun::run(const std::vector<std::string>& arguments, ToolProcess::
 
 ToolResult ToolRun::ask(const std::vector<std::string>& arguments) {
     std::string all;
-    ToolResult result = run(arguments, ToolProcess::Stream::output, [&](std::string& text) {
+    ToolResult result = run(arguments, ChildProcess::Stream::output, [&](std::string& text) {
         all += text;
         text.clear();
     });
@@ -105,7 +106,7 @@ ToolResult ToolRun::work(std::vector<std::string> arguments,
                          const std::function<void(const ProgressState&)>& progress) {
     arguments.insert(arguments.end(), {"--progress", "json"});
     ToolResult reported;
-    const ToolResult ended = run(arguments, ToolProcess::Stream::error, [&](std::string& text) {
+    const ToolResult ended = run(arguments, ChildProcess::Stream::error, [&](std::string& text) {
         size_t at = 0;
         for (size_t end = 0; (end = text.find('\n', at)) != std::string::npos; at = end + 1)
             takeObject(text.substr(at, end - at), reported, progress);
@@ -119,11 +120,18 @@ ToolResult ToolRun::work(std::vector<std::string> arguments,
     return reported;
 }
 
-void ToolRun::reach(void (ToolProcess::*call)() const) const {
+void ToolRun::reach(void (ChildProcess::*call)() const) const {
     const std::lock_guard guard(lock_);
     if (running_) (running_->*call)();
 }
 
-void ToolRun::stop() const { reach(&ToolProcess::stop); }
-void ToolRun::pause() const { reach(&ToolProcess::pause); }
-void ToolRun::resume() const { reach(&ToolProcess::resume); }
+void ToolRun::endAtOnce() const {
+    constexpr int patience = 2000;  // ms
+    const std::lock_guard guard(lock_);
+    if (!running_) return;
+    running_->askToEnd();
+    if (!running_->endsWithin(patience)) running_->kill();
+}
+
+void ToolRun::pause() const { reach(&ChildProcess::pause); }
+void ToolRun::resume() const { reach(&ChildProcess::resume); }

@@ -6,7 +6,7 @@
 #include <string>
 #include <vector>
 
-#include "tarsel/host/follow/toolprocess.h"
+#include "tarsel/host/childprocess.h"
 #include "tarsel/host/follow/wake.h"
 #include "tarsel/job/progress.h"
 
@@ -31,20 +31,20 @@ class ToolRun {
                     const std::function<void(const ProgressState&)>& progress);
 
     // To the run that there is, from any thread.
-    void stop() const;
+    void endAtOnce() const;  // it is given a moment for what it would leave
     void pause() const;
     void resume() const;
 
   private:
     class Running;
-    ToolResult run(const std::vector<std::string>& arguments, ToolProcess::Stream stream,
+    ToolResult run(const std::vector<std::string>& arguments, ChildProcess::Stream stream,
                    const std::function<void(std::string&)>& got);
 
-    void reach(void (ToolProcess::*call)() const) const;
+    void reach(void (ChildProcess::*call)() const) const;
 
     Wake& wake_;
     int other_;
     std::function<void()> arrived_;
     mutable std::mutex lock_;  // of the one below
-    ToolProcess* running_ = nullptr;
+    ChildProcess* running_ = nullptr;
 };

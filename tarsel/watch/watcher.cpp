@@ -42,6 +42,13 @@ const char* whyNever(const FileFacts& facts) {
     }
 }
 
+// Whether a run ended so for a reason that is not in its input: the disk is full, no process could be begun,
+// a person or the system, short of memory, has ended it.
+bool isOfTheMoment(int status) {
+    return status == static_cast<int>(Exit::output) || status > static_cast<int>(Exit::check) ||
+           status == ChildProcess::kKilled;
+}
+
 // The files that a run says it has written, with their size and time now.
 std::vector<MadeFile> madeFiles(const std::vector<std::string>& names, const std::string& planned) {
     std::vector<MadeFile> made;
@@ -73,7 +80,7 @@ void Watcher::run() {
     const Signals::Watch watching(signals_, {.first = [this](int) { wake_.stop(); },
                                              .second =
                                                  [this] {
-                                                     tool_.stop();
+                                                     tool_.endAtOnce();
                                                      return false;
                                                  },
                                              .suspend = [this] { tool_.pause(); },
@@ -335,8 +342,7 @@ Watcher::Ended Watcher::makeTarget(WatchedFile& file, int target, const std::str
     progress.finish(last);
     if (result.status != 0 && stopped()) return Ended::stopped;
     if (factsOf(path) != file.facts) return Ended::changed;
-    if (result.status == static_cast<int>(Exit::output) || result.status >= static_cast<int>(Exit::hangup))
-        return waitFor(file.name, result.failure);
+    if (isOfTheMoment(result.status)) return waitFor(file.name, result.failure);
     if (result.status != 0) {
         // Of an input that can't be opened all targets say the same.
         if (std::count(failures.begin(), failures.end(), result.failure) == 0)

@@ -5,6 +5,10 @@
 
 using Json = nlohmann::ordered_json;
 
+// Names of files may have any bytes, JSON only texts: what is not plain ASCII is "%c3", as is '%' itself.
+std::string escapedBytes(const std::string& bytes);
+std::string unescapedBytes(const std::string& text);
+
 // File names need not be UTF-8; JSON does.
 inline std::string validUtf8(const std::string& bytes) {
     return Json::parse(Json(bytes).dump(-1, ' ', false, Json::error_handler_t::replace)).get<std::string>();

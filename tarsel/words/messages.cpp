@@ -381,7 +381,6 @@ constexpr Message kMessages[] = {
     {Msg::watchOutputInside,   Exit::usage,  "can't write to {file}",              "it is in the watched folder, where outputs would be new inputs", "choose an output folder elsewhere"},
     {Msg::watchSameOutputs,    Exit::usage,  "can't write to {file}",              "two presets would write files of the same names there", "give one of them another folder"},
     {Msg::watchFolderIsOther,  Exit::usage,  "{option}",                           "{file} is the watched folder or one that outputs go to", "choose another folder"},
-    {Msg::watchMemory,         Exit::output, "can't keep what was done in {file}", "{text}",                                              "{text}"},
     {Msg::watchTwice,          Exit::failed, "can't keep what was done in {file}", "another 'tarsel watch' uses it",                      "stop that one, or give another file with --state"},
     {Msg::watchBegins,         Exit::done,   "watching {file}",                    "each file is taken when it is complete",             ""},
     {Msg::watchEnds,           Exit::done,   "done with {file}",                   "files: {text}",                                       ""},

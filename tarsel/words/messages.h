@@ -381,7 +381,6 @@ enum class Msg : unsigned short {
     watchOutputInside,
     watchSameOutputs,
     watchFolderIsOther,
-    watchMemory,
     watchTwice,
     watchBegins,
     watchEnds,

@@ -1,4 +1,5 @@
-"""SIGKILL to a run of a batch at random moments, again and again until a run reaches its end.
+"""SIGKILL to a run of a batch at random moments, again and again until a run reaches its end; and right before each
+system call that can change a file, in the run or in a task of it.
 
 At the end every output has the right bytes, nothing hidden is left, and only tasks that were running when a run was killed
 were done more than once: of a task whose end was noted, the files stay as they are.
@@ -86,6 +87,60 @@ def attack(sweep, seed):
         return ("ok" if killed else "not met"), None, outcome
 
 
+def begin(box):
+    """A list of one task whose output is a set of files, and how often the task was done so far."""
+    box.run(["batch", "night.xml", "new"])
+    box.run(["batch", "night.xml", "add", "testgen:size=32x32,rate=25,duration=0.2", "-o", "set.raw"])
+
+
+def traced(box, sweep, number):
+    return box.run(["batch", "night.xml", "run"], {"ASAN_OPTIONS": "detect_leaks=0"},
+                   wrap=[sweep.killat, box.root / "report", number])
+
+
+def content(box):
+    return {path.name: path.read_bytes() for path in box.work.glob("set.*")}
+
+
+def points(sweep):
+    """How many moments there are, and what the task makes."""
+    with Box(sweep) as box:
+        begin(box)
+        if traced(box, sweep, 0).status != 0 or len(content(box)) < 2:
+            raise SystemExit("sweep: the batch fails by itself")
+        return len((box.root / "report").read_text().splitlines()), content(box)
+
+
+def attack_at(sweep, number, right):
+    """Between "placing" and "done" above all: what was placed is not made again, what was not is."""
+    with Box(sweep) as box:
+        begin(box)
+        outcome = traced(box, sweep, number)
+        deadline = time.monotonic() + 20
+        before = {}
+        while time.monotonic() < deadline:  # its task ends after it
+            before = {path.name: path.stat().st_ino for path in box.work.glob("set.*")}
+            if "running" not in box.run(["batch", "night.xml", "status"]).text:
+                break
+        placed = content(box) == right and not box.litter()
+        again = box.run(["batch", "night.xml", "run"])
+        wrong = None
+        if again.status != 0:
+            wrong = f"the next run fails: {again.text.strip()}"
+        elif content(box) != right:
+            wrong = "the files are not those of the task"
+        elif placed and before != {path.name: path.stat().st_ino for path in box.work.glob("set.*")}:
+            wrong = "what was placed was made again"
+        elif box.litter():
+            wrong = f"leaves {', '.join(box.litter())}"
+        elif any(events[-1] != "done" or events.count("done") != 1 for events in steps(box).values()):
+            wrong = f"the journal is {steps(box)}"
+        return "killed" if outcome.status == 137 else outcome.ended(), wrong and f"after the kill: {wrong}", again
+
+
 def cases(sweep, pool, rng):
+    count, right = points(sweep)
+    for number in range(1, count + 1):
+        yield "batchkill", f"{number}", lambda number=number: attack_at(sweep, number, right)
     for number in range(17):
         yield "batch", f"kills/{number}", lambda seed=f"{sweep.options.seed}/{number}": attack(sweep, seed)

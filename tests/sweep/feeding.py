@@ -2,13 +2,15 @@
 
 At the end each complete file has been made once, or once more where a kill fell into its making, with all its samples;
 it is in the folder for what was done, unchanged; what can't be made is in the one for failures, with a text; what is no
-complete file is where it was.
+complete file is where it was. In the middle of it the disk of the outputs is full, where this user may mount one.
 """
+import contextlib
 import os
 import random
 import re
 import signal
 import struct
+import subprocess
 import threading
 import time
 
@@ -120,12 +122,43 @@ class Feed:
         return threads
 
 
-def wrong_with(box, files, lines, kills):
+class Disk:
+    """A disk of its own for the outputs, in a name space of its own, that a process holds while this lives. Where that
+    can't be made, `wrap` is empty and `out` is the plain folder."""
+
+    SIZE = 96 << 20
+
+    def __init__(self, work):
+        self.wrap, self.out = [], work / "out"
+        self.out.mkdir()
+        self.holder = subprocess.Popen(
+            ["unshare", "-rm", "sh", "-c", f'mount -t tmpfs -o size={self.SIZE} none "$1" && echo made && exec sleep 3600',
+             "sh", self.out], stdout=subprocess.PIPE, stderr=subprocess.DEVNULL, text=True)
+        if self.holder.stdout.readline():
+            self.wrap = ["nsenter", "-t", self.holder.pid, "-U", "-m", "--preserve-credentials", f"--wd={work}"]
+            self.out = type(work)(f"/proc/{self.holder.pid}/root{self.out}")
+
+    def full(self, seconds):
+        """Leaves a few blocks for so long."""
+        with (self.out / ".filler").open("wb", buffering=0) as filler, contextlib.suppress(OSError):
+            while True:
+                filler.write(bytes(1 << 16))
+        os.truncate(self.out / ".filler", (self.out / ".filler").stat().st_size - (1 << 14))
+        time.sleep(seconds)
+        (self.out / ".filler").unlink()
+
+    def close(self):
+        self.holder.kill()
+        self.holder.wait()
+        self.holder.stdout.close()
+
+
+def wrong_with(box, out, files, lines, kills):
     """What is wrong at the end, or None."""
     work = box.work
 
     def read(name):
-        path = work / name
+        path = out / name[4:] if name.startswith("out/") else work / name
         return path.read_bytes() if path.is_file() else None
 
     for name, (writer, file) in files.items():
@@ -147,19 +180,22 @@ def wrong_with(box, files, lines, kills):
         elif times > 1 + kills or (kills == 0 and times != 1):
             return f"{name} was made {times} times"
     inputs = [name for name, (writer, _) in files.items() if writer not in STAY and writer is not damaged]
-    odd = [path.name for path in (work / "out").iterdir() if path.name not in inputs]
+    odd = [path.name for path in out.iterdir() if path.name not in inputs]
     return f"leaves {', '.join(odd)} among the outputs" if odd else None
 
 
 def attack(sweep, form, seed):
     _, seconds, kills = form
-    with Box(sweep) as box:
+    with Box(sweep) as box, contextlib.closing(Disk(box.work)) as disk:
         feed = Feed(box.work, form, seed)
         arguments = ["watch", "in", "--preset", "RAW:out", "--move", "done", "--failed", "bad", "--settle", SETTLE]
         threads, rng, said = feed.run(), random.Random(seed), box.root / "said"
+        if disk.wrap:
+            threads.append(threading.Timer(seconds / 3, disk.full, [min(seconds / 5, 60)]))
+            threads[-1].start()
         for turn in range(kills + 1):
             with said.open("ab") as to:  # more than a pipe holds
-                process = box.start(arguments, stderr=to)
+                process = box.start(arguments, wrap=disk.wrap, stderr=to)
             if turn < kills:
                 time.sleep(seconds / (kills + 1) * rng.uniform(0.6, 1.4))
                 process.send_signal(signal.SIGKILL)
@@ -170,13 +206,14 @@ def attack(sweep, form, seed):
             outcome = box.finish(process)
             if turn == kills and outcome.status != 143:
                 return outcome.ended(), f"ends with {outcome.status}: {said.read_text(errors='replace')[-500:]}", outcome
-        outcome = box.run([*arguments, "--once"])
+        outcome = box.run([*arguments, "--once"], wrap=disk.wrap)
         lines = said.read_text(errors="replace") + outcome.text
-        wrong = crashed(outcome) or wrong_with(box, feed.files, lines, kills)
+        wrong = crashed(outcome) or wrong_with(box, disk.out, feed.files, lines, kills)
         if not wrong and outcome.status not in (0, 1):
             wrong = f"ends with {outcome.status}: {outcome.text[-500:]}"
-        if not wrong and box.litter():
-            wrong = f"leaves {', '.join(box.litter())}"
+        litter = box.litter() + [path.name for path in disk.out.rglob(".tarsel*")]
+        if not wrong and litter:
+            wrong = f"leaves {', '.join(litter)}"
         return outcome.ended(), wrong, outcome
 
 

@@ -3,9 +3,9 @@
 //   killat REPORT N COMMAND [ARGUMENT...]
 //
 // Between two such calls the files on the disk are the same, so a kill before each of them is a kill at every
-// moment that makes a difference. With N = 0 nothing is killed. With KILLAT_ALL set every system call counts.
-// The calls that counted are written to REPORT, a line "NUMBER NAME" each. The exit status is the program's,
-// or 128 + the signal.
+// moment that makes a difference. A child of the program that makes the call is killed with it. With N = 0
+// nothing is killed. With KILLAT_ALL set every system call counts. The calls that counted are written to
+// REPORT, a line "NUMBER NAME" each. The exit status is the program's, or 128 + the signal.
 #include <fcntl.h>
 #include <sys/ptrace.h>
 #include <sys/syscall.h>
@@ -81,7 +81,10 @@ int follow(pid_t program, long target, FILE* report) {
             ptrace(PTRACE_GET_SYSCALL_INFO, id, reinterpret_cast<void*>(sizeof info), &info);
             const char* name = info.op == PTRACE_SYSCALL_INFO_ENTRY ? counted(info) : nullptr;
             if (name) fprintf(report, "%ld %s\n", ++number, name);
-            if (name && number == target) kill(program, SIGKILL);
+            if (name && number == target) {
+                kill(program, SIGKILL);
+                kill(id, SIGKILL);  // a child, before its call is made
+            }
         } else if ((status >> 16) != 0 || (signal == SIGSTOP && known.insert(id).second)) {
             signal = 0;  // an event of the tracing, or the first stop of a new thread
         }

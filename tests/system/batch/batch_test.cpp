@@ -1,6 +1,9 @@
 // Lists of tasks and their runs.
 #include <sys/file.h>
 
+#include <nlohmann/json.hpp>
+#include <sstream>
+
 #include "tests/system/tool.h"
 
 namespace {
@@ -29,6 +32,31 @@ class Batch : public Tool {
         for (const std::string& name : listing())
             if (name.rfind("l.xml", 0) != 0 && name != "in.wav") names.insert(name);
         return names;
+    }
+
+    // The journal of the only task, and the number of the process that runs it, 0 for none.
+    fs::path journal() const {
+        for (const auto& entry : fs::directory_iterator(folder.path() / "l.xml.journal.d"))
+            if (entry.path().filename() != "run") return entry.path();
+        return {};
+    }
+    pid_t runner() const {
+        std::error_code error;
+        if (!fs::exists(folder.path() / "l.xml.journal.d", error) || journal().empty()) return 0;
+        const std::string lines = TempFolder::read(journal().string());
+        const size_t at = lines.rfind("\"pid\":");
+        return at == std::string::npos ? 0 : std::atoi(lines.c_str() + at + 6);
+    }
+    // Waits until a process runs it that is not `former`.
+    pid_t nextRunner(Process& run, pid_t former = 0) const {
+        while (run.waitFor("\"progress\""))
+            if (const pid_t process = runner(); process != former) return process;
+        return 0;
+    }
+    static char stateOf(pid_t process) {
+        const std::string text = TempFolder::read("/proc/" + std::to_string(process) + "/stat");
+        const size_t at = text.rfind(") ");
+        return at == std::string::npos ? '-' : text[at + 2];
     }
 
     // A job that runs until it is stopped, and well beyond any test.
@@ -187,9 +215,7 @@ TEST_F(Batch, OneRunAtATimeAndItsTasksEndWithIt) {
     ASSERT_TRUE(first.waitFor("\"progress\""));
     for (int i = 0; i < 500 && status().find("1 running") == std::string::npos; ++i) {
     }
-    std::string journal;
-    for (const auto& entry : fs::directory_iterator(folder.path() / "l.xml.journal.d"))
-        if (entry.path().filename() != "run") journal = entry.path().string();
+    const std::string journal = this->journal().string();
     ASSERT_FALSE(journal.empty());
     const Outcome second = run();
     EXPECT_EQ(second.status, 1);
@@ -202,6 +228,77 @@ TEST_F(Batch, OneRunAtATimeAndItsTasksEndWithIt) {
     EXPECT_EQ(flock(file, LOCK_EX), 0);
     close(file);
     EXPECT_THAT(status(), HasSubstr("1 interrupted"));
+}
+
+// A crash is the failure of that task, and what it leaves does not stay.
+TEST_F(Batch, ATaskThatCrashesHasFailed) {
+    add({"testgen:size=64x64,rate=25,duration=20000", "-o", "long.raw", "--no-audio"});
+    Process run(words({"batch", "l.xml", "run", "--progress", "json", "--retry", "1"}), here());
+    const pid_t first = nextRunner(run);
+    ASSERT_GT(first, 0);
+    EXPECT_EQ(kill(first, SIGSEGV), 0);
+    ASSERT_TRUE(run.waitFor("task 1 is tried again: can't make"));
+    const pid_t second = nextRunner(run, first);
+    ASSERT_GT(second, 0);
+    EXPECT_EQ(kill(second, SIGKILL), 0);
+    const Outcome o = run.finish();
+    EXPECT_EQ(o.status, 1) << o.err;
+    EXPECT_THAT(o.err, HasSubstr("signal 11 ended the process"));
+    EXPECT_THAT(o.err, HasSubstr("signal 9 ended the process"));
+    EXPECT_EQ(outputs(), std::set<std::string>()) << "litter";
+    EXPECT_THAT(status(), HasSubstr("1 interrupted"));
+}
+
+// Ctrl-Z stops the processes of the tasks as well, and they continue with the run.
+TEST_F(Batch, AStoppedRunStopsItsTasks) {
+    add(endless("long.raw"));
+    Process run(words({"batch", "l.xml", "run", "--progress", "json"}), here());
+    const pid_t task = nextRunner(run);
+    ASSERT_GT(task, 0);
+    const auto become = [&](bool stopped) {
+        for (int i = 0; i < 10000; ++i) {
+            if ((stateOf(task) == 'T') == stopped && (stateOf(run.id()) == 'T') == stopped) return true;
+            usleep(1000);
+        }
+        return false;
+    };
+    run.signal(SIGTSTP);
+    EXPECT_TRUE(become(true));
+    run.signal(SIGCONT);
+    EXPECT_TRUE(become(false));
+    EXPECT_TRUE(run.waitFor("\"progress\""));
+    // One that is stopped ends as well.
+    run.signal(SIGTSTP);
+    EXPECT_TRUE(become(true));
+    run.signal(SIGTERM);
+    run.signal(SIGCONT);
+    EXPECT_EQ(run.finish().status, 143);
+    EXPECT_EQ(stateOf(task), '-');
+}
+
+TEST_F(Batch, EachTaskHasObjectsAndALog) {
+    makeWav("gone.wav", 500);
+    add({"in.wav", "-o", "a.wav"});
+    add({"gone.wav", "-o", "b.wav"});
+    remove("gone.wav");
+    const Outcome o = tarsel({"--log", "log", "batch", "l.xml", "run", "--progress", "json", "--retry", "2"});
+    EXPECT_EQ(o.status, 1);
+    std::map<int, nlohmann::json> ends;
+    std::istringstream lines(o.err);
+    for (std::string line; std::getline(lines, line);) {
+        const auto object = nlohmann::json::parse(line);
+        if (object["event"] != "task" || object["status"].is_null()) continue;
+        EXPECT_TRUE(ends.emplace(object["task"].get<int>(), object).second) << "one end each: " << line;
+    }
+    ASSERT_EQ(ends.size(), 2u) << o.err;
+    EXPECT_EQ(ends[1]["state"], "done");
+    EXPECT_EQ(ends[1]["percent"], 100);
+    EXPECT_EQ(ends[1]["outputs"].at(0), folder.file("a.wav"));
+    EXPECT_EQ(ends[2]["state"], "failed");
+    EXPECT_EQ(ends[2]["attempt"], 3);
+    EXPECT_EQ(ends[2]["status"], 3);
+    EXPECT_THAT(ends[2]["error"].get<std::string>(), HasSubstr("no such file"));
+    for (int i : {1, 2}) EXPECT_GT(size("log." + ends[i]["id"].get<std::string>()), 0);
 }
 
 TEST_F(Batch, SignalsStopAllTasks) {
@@ -222,9 +319,7 @@ TEST_F(Batch, SignalsStopAllTasks) {
 TEST_F(Batch, WhatWasPlacedIsDone) {
     add({"in.wav", "-o", "a.wav"});
     EXPECT_EQ(run().status, 0);
-    fs::path journal;
-    for (const auto& entry : fs::directory_iterator(folder.path() / "l.xml.journal.d"))
-        if (entry.path().filename() != "run") journal = entry.path();
+    const fs::path journal = this->journal();
     const std::string all = TempFolder::read(journal.string());
     const size_t done = all.rfind('\n', all.size() - 2) + 1;
     const auto before = fs::last_write_time(folder.file("a.wav"));

@@ -165,6 +165,20 @@ TEST_F(Watch, AKilledRunIsMadeUpFor) {
         EXPECT_THAT(name, testing::Not(HasSubstr(".tarsel-"))) << "is left";
 }
 
+// What the run was told of plug-ins holds in the processes that do its work.
+TEST_F(Watch, PlugInsReachTheTranscodes) {
+    fs::create_directory(folder.path() / "plugins");
+    fs::copy_file(QV_BINARY_DIR "/plugins/pcm8_plugin.so", folder.path() / "plugins/pcm8_plugin.so");
+    folder.write("in/tone.pcm8", patternBytes(5000));
+    works(Words{"--plugins", "plugins"} + watch({"--once"}));
+    EXPECT_TRUE(wavPart(contents("out/tone.wav"), "data") == patternBytes(5000));
+    works({"batch", "l.xml", "new"});
+    works({"--plugins", "plugins", "batch", "l.xml", "add", "in/tone.pcm8", "-o", "task.wav"});
+    EXPECT_EQ(tarsel({"--no-plugins", "batch", "l.xml", "run"}).status, 1);
+    works({"--plugins", "plugins", "batch", "l.xml", "run"});
+    EXPECT_EQ(contents("task.wav"), contents("out/tone.wav"));
+}
+
 TEST_F(Watch, RefusesWhatWouldGoRound) {
     fs::create_directory(folder.path() / "other");
     fs::create_symlink("in", folder.path() / "way");
