@@ -1,5 +1,6 @@
 #include "tarsel/job/jobrun.h"
 
+#include <algorithm>
 #include <new>
 #include <optional>
 
@@ -129,8 +130,7 @@ void JobRun::addClipped(const std::vector<long long>& clipped) {
 int JobRun::start(JobTranscoder& transcoder) {
     if (const std::string name = parts_.outputs.begin(); !name.empty())
         parts_.pipe->setFilename(Any(name.c_str()));
-    options_.measuredFor < 0 ? progress_.start()
-                             : progress_.start({.part = 0.5, .pass = 2, .passes = 2}, options_.measuredFor);
+    progress_.start(transcoder.begin(), std::max(options_.measuredFor, 0.0));
     qv_log()->clear();
     stopIfSignalled();
     const int result = transcoder.transcode(false);
