@@ -75,6 +75,9 @@ TEST_F(Encoders, AreChosenByCodecAndByExtension) {
                       HasSubstr("h264venc: 64x48")));
     EXPECT_THAT(plan({"-o", "x.mkv", "--vcodec", "ffv1"}),
                 HasSubstr("preset  'Any codec', for --vcodec 'ffv1' in mkvmux"));
+    for (const Words& parts : {Words{}, Words{"--cut", "0-0.1"}})
+        EXPECT_THAT(plan(Words{"-o", "x.mp4", "--two-pass"} + parts), HasSubstr("I420 25, two passes\n"));
+    EXPECT_THAT(plan({"-o", "x.mp4", "--vcodec", "h264:tune=a,crf=2"}), HasSubstr("25, tune 'a', crf '2'\n"));
     EXPECT_THAT(plan({"-o", "x.mp4", "--preset", "h264_high"}),
                 AllOf(HasSubstr("320x240"), Not(HasSubstr("preset  "))));
     EXPECT_THAT(plan({"--muxer", "nullmux", "--vcodec", "ffv1"}), HasSubstr("encoder ffv1venc"));
