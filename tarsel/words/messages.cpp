@@ -237,7 +237,7 @@ constexpr Message kMessages[] = {
     {Msg::codecMissing,      Exit::module, "{option} {name}",                        "the encoder {text} is not installed",                   "load the plug-in that has it with --plugins"},
     {Msg::codecNoneSet,      Exit::usage,  "{option} none",                          "what is left out has no settings",                      "leave them out, or name a codec"},
     {Msg::codecFormat,       Exit::usage,  "{option} {name}",                        "{file} holds {text}",                                   "give the output another extension, or leave the option out"},
-    {Msg::codecMuxer,        Exit::usage,  "{option} {name}",                        "{text}, which writes {file}, does not take it",         "it takes {text}; use one of these, or give the output another extension"},
+    {Msg::codecMuxer,        Exit::usage,  "{option} {name}",                        "{text}, which writes {file}, does not take it",         "give the output another extension, or use one of: {text}"},
     {Msg::codecPreset,       Exit::usage,  "{option} {name}",                        "the preset {name} does not go with it",                 "use one of {text}, or leave --preset out"},
     {Msg::codecsApart,       Exit::usage,  "-o {file}",                              "no installed preset joins {text}",                      "'tarsel presets show NAME' shows what a preset joins"},
     {Msg::muxerMissing,      Exit::module, "-o {file}",                              "the multiplexer {text} is not installed",               "load the plug-in that has it with --plugins"},
