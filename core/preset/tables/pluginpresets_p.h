@@ -1,6 +1,6 @@
 // What plug-ins add to the catalogue of presets: the attribute "presets" of a plug-in, and the attributes
-// "compatMuxers" of its encoders and "compatEncoders" of its multiplexers. All come from outside: what is ill-formed is left out, with a line in the
-// log.
+// "compatMuxers" of its encoders and "compatEncoders" of its multiplexers. All come from outside: what is
+// ill-formed is left out, with a line in the log.
 #pragma once
 
 #include <string>
