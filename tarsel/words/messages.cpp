@@ -173,6 +173,7 @@ constexpr Message kMessages[] = {
     {Msg::stdinUnused,     Exit::usage,  "--input-format",                        "it describes the standard input, and no input is -",               "leave it out"},
     {Msg::stdinTwice,      Exit::usage,  "can't open {file} twice",               "the standard input is one input",                                  "name it once"},
     {Msg::stdinRefuses,    Exit::usage,  "{option}",                              "it needs inputs with names, and the standard input has none",      "write it into a file first"},
+    {Msg::streamReadTwice, Exit::usage,  "{option}",                              "it reads the pictures twice, and the standard input can be read once", "write it into a file first, or leave the option out"},
     {Msg::stdinIsDocument, Exit::usage,  "{option}",                              "such a file names others, seen from the folder that it is in",     "give the file by its name"},
     {Msg::stdinClosed,     Exit::input,  "can't open {file}",                     "the standard input is closed",                                     "send a file into it"},
     {Msg::stdinIsTerminal, Exit::usage,  "can't open {file}",                     "the standard input is a terminal",                                 "send a file into it, or the output of another program"},

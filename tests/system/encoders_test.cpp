@@ -118,6 +118,7 @@ TEST_F(Encoders, RefuseWhatDoesNotGoTogether) {
         {2, {"-o", "-", "--vcodec", "h264"}, {"--format"}},
     };
     for (const auto& row : rows) fails(row.status, job(row.options), row.parts);
+    fails(2, coded({"transcode", "-", "--input-format", "wav", "-o", "x.mp4", "--two-pass"}), {"--two-pass"});
 }
 
 // A container goes to a pipe whole, and is told that nobody can go back there.
