@@ -50,7 +50,9 @@ void addThreads(Command& command, std::string& threads) {
                    "N");
 }
 
-void limitThreads(const std::string& threads) {
-    if (!threads.empty())
-        qvSetThreads(static_cast<int>(parseNumber(threads, 1, kQvMostThreads, "--threads")));
+int limitThreads(const std::string& threads) {
+    if (threads.empty()) return 0;
+    const int most = static_cast<int>(parseNumber(threads, 1, kQvMostThreads, "--threads"));
+    qvSetThreads(most);
+    return most;
 }

@@ -18,5 +18,5 @@ struct OutputOptions {
 
 // --threads: how many threads of the engine share the work on pictures.
 void addThreads(Command& command, std::string& threads);
-// Throws Failure (usage). Before the first picture.
-void limitThreads(const std::string& threads);
+// The number, 0 for none. Throws Failure (usage). Before the first picture.
+int limitThreads(const std::string& threads);

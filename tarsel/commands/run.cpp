@@ -19,7 +19,7 @@ struct Given {
 };
 
 void run(Given& given, Signals& signals) {
-    limitThreads(given.threads);
+    given.job.threads = limitThreads(given.threads);
     given.job.policy = given.outputs.policy();
     given.job.policy.recover = !given.job.dryRun;
     given.job.policy.quiet = given.job.quiet;

@@ -103,6 +103,7 @@ void takeStandardInput(Given& given) {
     job.standardInput = standardInputOf(job.inputs, given.inputFormat);
     if (!job.standardInput) return;
     if (!job.saveTask.empty()) throw failure(Msg::stdinRefuses, {"--save-task"});
+    if (job.encoders.twoPass) throw failure(Msg::streamReadTwice, {"--two-pass"});
     if (postNames(job.post, job.inputs, StandardInput::kName))
         throw failure(Msg::stdinRefuses, {"--post with %i"});
 }
@@ -140,7 +141,7 @@ void openEvents(Given& given, const std::string& version) {
 
 void transcode(Given& given, Signals& signals) {
     JobOptions& job = given.job;
-    limitThreads(given.threads);
+    job.threads = limitThreads(given.threads);
     job.policy = given.outputs.policy();
     job.policy.recover = !job.dryRun;
     job.policy.quiet = job.quiet;

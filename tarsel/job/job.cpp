@@ -13,6 +13,7 @@
 #include "tarsel/job/jobrun.h"
 #include "tarsel/job/keptchunks.h"
 #include "tarsel/job/outputpipe.h"
+#include "tarsel/job/plan/inputfit.h"
 #include "tarsel/job/savedtask.h"
 #include "tarsel/job/task/joinplanner.h"
 #include "tarsel/job/task/taskfilters.h"
@@ -77,13 +78,12 @@ Job::Job(const JobOptions& options, Signals& signals)
       warnings_(options.warnings) {
     if (options_.inputs.empty()) throw failure(Msg::inputMissing);
     if (options_.joins()) {
-        if (options_.match) throw failure(Msg::joinRefuses, {"--match"});
         joinInputs();
         return;
     }
     openInputs();
     joinSounds();
-    if (options_.match) fitToInputs();
+    if (fitsInputs(options_)) fitToInputs();
     begin(planJob(options_, parts_.outputs.form(), readInputs()));
 }
 
@@ -153,26 +153,9 @@ void Job::joinInputs() {
     begin(std::move(plan));
 }
 
-// Each property by itself: an encoder need not have all of them.
 void Job::fitToInputs() {
     options_.fit = [this](int type, int input, int stream, QvEncoder& encoder) {
-        using Matcher = QvFormatMatcher;
-        const QvDecodePipe& decoder = parts_.sources[static_cast<size_t>(input)]->decoder();
-        static constexpr int properties[] = {Matcher::type,         Matcher::dimensions | Matcher::framerate,
-                                             Matcher::frameAspect,  Matcher::videoBitrate,
-                                             Matcher::gop,          Matcher::channels,
-                                             Matcher::samplerate,   Matcher::audioBitrate,
-                                             Matcher::bitsPerSample};
-        for (const int property : properties) {
-            const Matcher matcher(property, 0, &options_.preset->preset());
-            try {
-                if (type == qvVideoStream)
-                    matcher.matchVideo(&decoder, stream, static_cast<QvVideoEncoder*>(&encoder));
-                else
-                    matcher.matchAudio(&decoder, stream, static_cast<QvAudioEncoder*>(&encoder));
-            } catch (const QvParamException&) {  // not one of its parameters
-            }
-        }
+        fitEncoder(encoder, type, parts_.sources[static_cast<size_t>(input)]->decoder(), stream, options_);
     };
 }
 

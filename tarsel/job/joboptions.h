@@ -17,7 +17,7 @@ struct JobOptions : PlanOptions {
     ProgressMode progress;
     OutputPolicy policy{false};
     std::string presetName;  // a preset's name or symbol
-    bool match = false;      // fit what the preset leaves open, and what it can do, to the inputs
+    int threads = 0;         // the most of each decoder and encoder; 0 for their own choice
     bool dryRun = false, quiet = false;
     bool relative = false;              // the task file has names that count from its folder
     bool unchanged = false;             // inputs that change meanwhile are failures

@@ -1,5 +1,6 @@
 #include "tarsel/job/jobrun.h"
 
+#include <algorithm>
 #include <new>
 #include <optional>
 
@@ -21,6 +22,17 @@ namespace {
 std::optional<Msg> lastWordOf(const OutputForm& output) {
     if (!output.isStream()) return std::nullopt;
     return Msg::stoppedWithPart;
+}
+
+}  // namespace
+
+namespace {
+
+void boundThreads(QvCodec& codec, int threads) {
+    try {
+        codec.setParam("threads", threads);
+    } catch (const QvParamException&) {  // it works in one
+    }
 }
 
 }  // namespace
@@ -125,13 +137,22 @@ void JobRun::addClipped(const std::vector<long long>& clipped) {
                                                      plan_.output.name, std::to_string(clipped[i])}));
 }
 
+// Of this run only: a task file does not keep it.
+void JobRun::boundThreads() const {
+    if (options_.threads == 0) return;
+    for (const auto& source : parts_.sources) ::boundThreads(source->decoder(), options_.threads);
+    for (const PlannedStream& stream : plan_.streams)
+        if (QvEncoder* const encoder = parts_.pipe->encoder(stream.type, stream.number))
+            ::boundThreads(*encoder, options_.threads);
+}
+
 // The result of the whole run.
 int JobRun::start(JobTranscoder& transcoder) {
     if (const std::string name = parts_.outputs.begin(); !name.empty())
         parts_.pipe->setFilename(Any(name.c_str()));
-    options_.measuredFor < 0 ? progress_.start()
-                             : progress_.start({.part = 0.5, .pass = 2, .passes = 2}, options_.measuredFor);
+    progress_.start(transcoder.begin(), std::max(options_.measuredFor, 0.0));
     addEngineWarnings();  // of joining the streams
+    boundThreads();
     stopIfSignalled();
     const int result = transcoder.transcode(false);
     // So it stays only where no worker could be started.

@@ -24,6 +24,7 @@ class JobRun {
     std::vector<ProcessParams> beginFilters();
     void transcode(const std::vector<ProcessParams>& params);
     void drive(JobTranscoder& transcoder);
+    void boundThreads() const;
     int start(JobTranscoder& transcoder);
     void addClipped(const std::vector<long long>& clipped);
     void addEngineWarnings();

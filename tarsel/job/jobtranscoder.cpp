@@ -31,9 +31,12 @@ JobTranscoder::JobTranscoder(JobParts& parts, Progress& progress)
 void JobTranscoder::join(const std::vector<ProcessParams>& params) {
     setEncoder(parts_.pipe.get());
     setParam("startDelay", 0);
-    AnyDict off;
-    off.set("off", 1);
-    setParam("progress", off);
+    const QvCodec& pipe = *parts_.pipe;
+    twoPass_ = pipe.getParam("twoPass").isTrue() && pipe.getParam("twoPassPossible").isTrue();
+    setParam("twoPass", twoPass_ ? 1 : 0);
+    AnyDict reports;
+    reports.set(twoPass_ ? "each" : "off", 1);
+    setParam("progress", reports);
     for (size_t i = 0; i < params.size(); ++i) {
         const PlannedStream& s = parts_.plan.streams[i];
         if (parts_.stored)
@@ -47,8 +50,20 @@ void JobTranscoder::join(const std::vector<ProcessParams>& params) {
 int JobTranscoder::cbProcess() {
     if (stop_.load(std::memory_order_relaxed)) return 1;
     began_.store(true, std::memory_order_relaxed);
+    if (analyzed_.load(std::memory_order_relaxed) >= 0) {
+        if (progress_.due()) progress_.update(analyzingState());
+        return 0;
+    }
     if (first_) units_.store(first_->outProcessed(), std::memory_order_relaxed);
     if (progress_.due()) progress_.update(state("running"));
+    return 0;
+}
+
+// The engine counts both passes as one whole.
+int JobTranscoder::cbProgress(double part) {
+    Any second;
+    getParam("secondPass", second);
+    analyzed_.store(second.isTrue() || !twoPass_ ? -1 : std::min(1.0, part * 2), std::memory_order_relaxed);
     return 0;
 }
 
@@ -76,7 +91,7 @@ int JobTranscoder::cbMuxClose(QvMuxer*) {
 
 void JobTranscoder::cbPaused(bool paused) {
     paused ? progress_.time().pause() : progress_.time().resume();
-    progress_.show(state(paused ? "paused" : "running"));
+    progress_.show(analyzed_ >= 0 ? analyzingState() : state(paused ? "paused" : "running"));
 }
 
 void JobTranscoder::cbDone(int result) {
@@ -110,13 +125,20 @@ void JobTranscoder::pressed(char key) {
 }
 
 void JobTranscoder::report() {
-    const bool measuring = measured_ >= 0 && !began_;
-    progress_.report(measuring ? measuringState() : stateAt(units_, isPaused() ? "paused" : phase_.load()));
+    if (measured_ >= 0 && !began_) return progress_.report(measuringState());
+    progress_.report(analyzed_ >= 0 ? analyzingState()
+                                    : stateAt(units_, isPaused() ? "paused" : phase_.load()));
 }
 
 ProgressState JobTranscoder::state(const char* name) const {
     if (!first_) return {.state = name};
     return stateAt(first_->outProcessed(), name);
+}
+
+ProgressState JobTranscoder::begin() const {
+    ProgressState s{.part = 0, .state = "running"};
+    countPasses(s, twoPass_ ? 1 : 0);
+    return s;
 }
 
 // By the first stream.
@@ -131,21 +153,26 @@ ProgressState JobTranscoder::stateAt(long long units, const char* name) const {
         stream.isVideo() ? static_cast<double>(stream.picture.rate.rate()) : stream.sound.samplerate;
     s.outSeconds = static_cast<double>(units) / rate;
     if (stream.isVideo()) s.frame = units;
-    countPasses(s, 2);
+    countPasses(s, 0);
     return s;
 }
 
 ProgressState JobTranscoder::measuringState() const {
     ProgressState s{.part = measured_, .state = "running"};
+    countPasses(s, twoPass_ ? 2 : 1);
+    return s;
+}
+
+ProgressState JobTranscoder::analyzingState() const {
+    ProgressState s{.part = analyzed_, .state = isPaused() ? "paused" : "running"};
     countPasses(s, 1);
     return s;
 }
 
-void JobTranscoder::countPasses(ProgressState& state, int pass) const {
-    if (measured_ < 0) return;
-    state.pass = pass;
-    state.passes = 2;
-    if (state.part >= 0) state.part = (state.part + pass - 1) / 2;
+void JobTranscoder::countPasses(ProgressState& state, int fromLast) const {
+    state.passes = 1 + (measured_ >= 0 ? 1 : 0) + (twoPass_ ? 1 : 0);
+    state.pass = state.passes - fromLast;
+    if (state.part >= 0) state.part = (state.part + state.pass - 1) / state.passes;
 }
 
 std::string JobTranscoder::reason() const {

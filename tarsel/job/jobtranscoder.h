@@ -24,6 +24,8 @@ class JobTranscoder : public QvTranscoder {
     void countMeasuring() { measured_ = 1; }
     // Joins the streams of the plan; `params` are those of each. Throws Failure.
     void join(const std::vector<ProcessParams>& params);
+    // What is shown when it starts: how many passes there are, and which is the first.
+    ProgressState begin() const;
     // The result of the run. `slow` is called when a requested stop takes a while.
     int wait(const std::function<void()>& slow);
 
@@ -47,8 +49,9 @@ class JobTranscoder : public QvTranscoder {
     std::string reason() const;
 
     int cbProcess() override;
-    // The sound is read once before the run, which makes two passes of it.
+    // The sound is read once before the run, which makes a pass more of it.
     void cbMeasure(double part) override;
+    int cbProgress(double part) override;
     int cbMuxClose(QvMuxer*) override;
     void cbPaused(bool paused) override;
     void cbDone(int result) override;
@@ -60,7 +63,10 @@ class JobTranscoder : public QvTranscoder {
     ProgressState state(const char* name) const;
     ProgressState stateAt(long long units, const char* name) const;
     ProgressState measuringState() const;
-    void countPasses(ProgressState& state, int pass) const;
+    // Of the pass in which an encoder looks at the pictures.
+    ProgressState analyzingState() const;
+    // `fromLast`: how many passes follow. What is done of the pass becomes that of the whole.
+    void countPasses(ProgressState& state, int fromLast) const;
     void takeFilterFailure();
     Failure failureOf(const QvCodec& filter) const;
 
@@ -71,6 +77,8 @@ class JobTranscoder : public QvTranscoder {
     std::atomic<const char*> phase_{"running"};
     std::atomic<double> measured_{-1};  // part of the sound; negative where none is measured
     std::atomic<bool> began_{false};    // the run itself
+    bool twoPass_ = false;
+    std::atomic<double> analyzed_{-1};  // part of the pictures, while the first of two passes goes over them
     ProgressState last_;
     std::vector<long long> written_, clipped_;
     std::optional<Failure> filterFailure_;

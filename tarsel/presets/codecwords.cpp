@@ -39,10 +39,7 @@ void takeModules(CodecWords& words) {
     }
     for (const char* const module : row->encoders())
         if (isEncoder(module, words.type)) words.modules.emplace_back(module);
-    const auto encoders = row->encoders();
-    if (words.modules.empty())
-        throw failure(Msg::codecMissing,
-                      {words.option, words.name, joined({encoders.begin(), encoders.end()}, " or ")});
+    if (words.modules.empty()) throw failure(Msg::codecMissing, {words.option, words.name, row->modules[0]});
     words.preset = row->preset ? row->preset : "";
 }
 

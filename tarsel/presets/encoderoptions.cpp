@@ -83,6 +83,17 @@ std::string EncoderOptions::given(int type) const {
     return twoPass ? "--two-pass" : !video.empty() ? "--vcodec" : "";
 }
 
+std::string EncoderOptions::text(int type) const {
+    const bool isVideo = type == qvVideoStream;
+    std::vector<std::string> parts;
+    const std::string& rate = isVideo ? bitrate : audioBitrate;
+    if (isVideo && !crf.empty()) parts.push_back("crf " + crf);
+    if (!rate.empty()) parts.push_back("bitrate " + rate);
+    for (const auto& [key, value] : isVideo ? video : audio) parts.push_back(key + " " + inQuotes(value));
+    if (isVideo && twoPass) parts.emplace_back("two passes");
+    return joined(parts);
+}
+
 void EncoderOptions::check() const {
     if (!crf.empty() && !bitrate.empty()) throw failure(Msg::optionsExclude, {"--crf", "--bitrate"});
     if (!crf.empty() && twoPass) throw failure(Msg::optionsExclude, {"--crf", "--two-pass"});

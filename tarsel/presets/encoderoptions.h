@@ -13,6 +13,8 @@ struct EncoderOptions {
 
     // The first one that asks something of the encoders of this type of stream; empty for none.
     std::string given(int type) const;
+    // What is asked of them, for plans: "crf 20, tune film, two passes".
+    std::string text(int type) const;
     // Throws Failure (usage) for options that exclude each other.
     void check() const;
 

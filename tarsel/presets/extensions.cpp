@@ -36,7 +36,7 @@ constexpr PresetExtension kExtensions[] = {
     {"m1v",  "rawmux",    "mpeg1",    "mp2",  {"MPEG1"}},
     {"vc1",  "rawmux",    "vc1",      "pcm",  {"VC1_HIGH"}},
     {"j2k",  "rawmux",    "jpeg2000", "pcm",  {"DCI_LOSSY"}},
-    {"y4m",  "y4mmux",    "raw",      nullptr},
+    {"y4m",  "y4mmux",    "raw",      nullptr, {}, nullptr, "I420"},
     {"m4a",  "mp4mux",    nullptr,    "aac"},
     {"mka",  "mkvmux",    nullptr,    "aac"},
     {"flac", "flacmux",   nullptr,    "flac"},

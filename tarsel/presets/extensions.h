@@ -13,6 +13,7 @@ struct PresetExtension {
     const char* audio;  // null for pictures alone
     const char* presets[most] = {};    // names or symbols, the first one that is installed is taken
     const char* otherMuxer = nullptr;  // for presets that do not have the first one; null for none
+    const char* pixel = nullptr;  // format of raw pictures that all programs read; null for that of the input
 
     bool soundOnly() const { return !video; }
 };

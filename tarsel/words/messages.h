@@ -173,6 +173,7 @@ enum class Msg : unsigned short {
     stdinUnused,
     stdinTwice,
     stdinRefuses,
+    streamReadTwice,
     stdinIsDocument,
     stdinClosed,
     stdinIsTerminal,

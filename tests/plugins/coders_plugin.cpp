@@ -200,15 +200,17 @@ class Container : public BaseMuxer {
 };
 
 struct ContainerModule : QvModule {
-    explicit ContainerModule(const char* name) : QvModule(QvModuleType::muxer, name, "of a test", name) {}
+    explicit ContainerModule(const char* name) : QvModule(QvModuleType::muxer, name, "of a test", name) {
+        if (std::string(name) == "y4mmux") setAttr("compatEncoders", AnyVector(Any("rawvenc")));
+    }
     QvCodec* create() override { return _setAttrs(new Container); }
 };
 
 AnyDict anyCodec() {
     AnyDict preset("profile", 0x2800020, "name", "Any codec", "group", "Tests");
-    preset.set("video", AnyVector("h264venc", "ffv1venc"));
+    preset.set("video", AnyVector("h264venc", "ffv1venc", "rawvenc"));
     preset.set("audio", AnyVector("aacaenc", "flacaenc"));
-    preset.set("muxers", AnyVector("mkvmux", "mp4mux"));
+    preset.set("muxers", AnyVector("mkvmux", "mp4mux", "y4mmux"));
     return preset;
 }
 
@@ -226,7 +228,7 @@ extern "C" QV_API QvPlugin* plugin_init() {
     plugin.addModule(new CoderModule<Pictures>(video, ffv1, AnyVector("mkvmux")));
     plugin.addModule(new CoderModule<Sounds>(audio, aac, AnyVector()));
     plugin.addModule(new CoderModule<Sounds>(audio, flac, AnyVector("mkvmux")));
-    for (const char* const name : {"mp4mux", "mkvmux"}) plugin.addModule(new ContainerModule(name));
+    for (const char* const name : {"mp4mux", "mkvmux", "y4mmux"}) plugin.addModule(new ContainerModule(name));
     plugin.setAttr("presets", AnyVector(Any(anyCodec())));
     return &plugin;
 }

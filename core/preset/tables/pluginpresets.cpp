@@ -133,29 +133,58 @@ std::vector<PluginPreset> qvPluginPresets(const AnyVector& taken, const CodecCom
     return found;
 }
 
-void qvAddPluginPairs(CodecCompat& pairs, const InstalledModules& installed) {
-    const QvRegistry& registry = *qv_registry();
-    for (int i = 0, n = registry.nrModules(); i < n; ++i) {
-        const QvModule& module = *registry.module(i);
-        const Any muxers = module.getAttr("compatMuxers");
-        if (!muxers.isValid()) continue;
-        const std::string name = module.name();
+namespace {
+
+bool isMuxer(const QvModule& module) { return module.getAttr("type").asInt32(0) == QvModuleType::muxer; }
+
+// What a module says of the other side of its pairs. Built-in encoders can't name the multiplexers of a
+// plug-in, so those name them.
+struct PairAttribute {
+    const char* name;
+    bool (*isOf)(const QvModule&);
+    const char* otherwise;  // why it is ignored
+    bool ofEncoders;
+};
+constexpr PairAttribute kPairs[] = {
+    {"compatMuxers", isEncoder, "the module is no encoder", true},
+    {"compatEncoders", isMuxer, "the module is no multiplexer", false},
+};
+
+void addPairs(CodecCompat& pairs, const QvModule& module, const PairAttribute& row,
+              const InstalledModules& installed) {
+    const Any others = module.getAttr(row.name);
+    if (!others.isValid()) return;
+    const std::string name = module.name();
+    const auto fits = [](const std::string& one) {
         // A longer name would be cut in the list and stand for another module.
-        const bool fits = name.size() <= AnyDict::maxKeyLength;
-        if (!muxers.isVector() || !isEncoder(module) || !fits) {
-            qv_dbg()->warning("[Preset] Module '%s': 'compatMuxers' ignored: %s", name.c_str(),
-                              !muxers.isVector()   ? "it is no vector"
-                              : !isEncoder(module) ? "the module is no encoder"
-                                                   : "the module's name is too long");
+        return one.size() <= AnyDict::maxKeyLength;
+    };
+    if (!others.isVector() || !row.isOf(module) || !fits(name)) {
+        qv_dbg()->warning("[Preset] Module '%s': '%s' ignored: %s", name.c_str(), row.name,
+                          !others.isVector()  ? "it is no vector"
+                          : !row.isOf(module) ? row.otherwise
+                                              : "the module's name is too long");
+        return;
+    }
+    if (row.ofEncoders) pairs.addCodec(name.c_str());
+    for (const Any& other : others.asVector()) {
+        const Any narrow = other.isText() ? other.toString() : Any();
+        if (!narrow.isValid()) {
+            qv_dbg()->warning("[Preset] Module '%s': an entry of '%s' is no name", name.c_str(), row.name);
             continue;
         }
-        pairs.addCodec(name.c_str());
-        for (const Any& muxer : muxers.asVector()) {
-            if (!muxer.isText())
-                qv_dbg()->warning("[Preset] Module '%s': an entry of 'compatMuxers' is no name",
-                                  name.c_str());
-            else if (const Any narrow = muxer.toString(); installed.has(narrow.asString("")))
-                pairs.add(name.c_str(), narrow.asString(""));
-        }
+        const std::string text = narrow.asString("");
+        if (!installed.has(text.c_str()) || !fits(text)) continue;
+        const std::string &encoder = row.ofEncoders ? name : text, &muxer = row.ofEncoders ? text : name;
+        pairs.addCodec(encoder.c_str());
+        pairs.add(encoder.c_str(), muxer.c_str());
     }
+}
+
+}  // namespace
+
+void qvAddPluginPairs(CodecCompat& pairs, const InstalledModules& installed) {
+    const QvRegistry& registry = *qv_registry();
+    for (int i = 0, n = registry.nrModules(); i < n; ++i)
+        for (const PairAttribute& row : kPairs) addPairs(pairs, *registry.module(i), row, installed);
 }

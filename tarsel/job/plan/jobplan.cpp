@@ -225,7 +225,8 @@ std::string planText(const JobPlan& plan) {
                 std::to_string(stream.part.stream) + " of " + inQuotes(plan.input(stream).name) + ", " +
                 formatTime(stream.part.in.seconds()) + " to " + formatTime(stream.part.out.seconds()) + "\n";
         for (const std::string& filter : stream.chain) text += "filter  " + filter + "\n";
-        text += std::string("encoder ") + stream.encoder() + ": " + formatOf(stream) + "\n";
+        text += std::string("encoder ") + stream.encoder() + ": " + formatOf(stream) +
+                (stream.set.empty() ? "" : ", " + stream.set) + "\n";
         text += "expect  " + std::to_string(stream.expected) + " " + stream.unit() + ", " +
                 std::to_string(stream.bytes(stream.expected)) + " bytes\n";
     }

@@ -26,6 +26,7 @@ struct PlannedStream {
     StreamPart part;
     std::string module;  // encoder of a stored task or a preset; empty for the one that writes raw streams
     AnyDict codec;       // what a preset sets it to
+    std::string set;     // what the options set of it, to be shown
     // The format that is written.
     PictureFormat picture;           // of video
     SoundFormat sound;               // of audio

@@ -141,12 +141,13 @@ OutputForm outputForm(const PlanOptions& options, OutputPlace place) {
     if (place == OutputPlace::nowhere) return form;
     form.kind = kindOf(options, place);
     checkMuxer(options, form.kind);
+    form.pixel = pixelOf(options, form.kind);
     if (form.kind == OutputKind::module) {
         form.muxerModule = options.preset ? options.preset->muxer() : options.muxer;
         const PresetExtension* const row = presetExtension(formatName(options));
         form.soundOnly = row && row->soundOnly();
+        if (row && row->pixel && form.pixel.empty()) form.pixel = row->pixel;
     }
-    form.pixel = pixelOf(options, form.kind);
     if (form.isStream()) checkStream(options, form.kind);
     if (form.isFiles()) takeNumbers(options, form);
     return form;

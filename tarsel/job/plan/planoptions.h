@@ -43,6 +43,7 @@ struct PlanOptions {
     bool splitChannels = false;
     bool acceptPartial = false;
     std::shared_ptr<const OutputPreset> preset;  // what the output is to be; null for none
-    // With --match: fits an encoder to a stream of an input.
+    bool match = false;  // --match: fit what the preset leaves open, and what it can do, to the inputs
+    // Fits an encoder to a stream of an input, whose number counts those of the plan; null for no fitting.
     std::function<void(int type, int input, int stream, QvEncoder& encoder)> fit;
 };

@@ -74,7 +74,10 @@ void PresetPlanner::takeSounds() {
 void PresetPlanner::takeEncoder(PlannedStream& stream) {
     QvEncoder& encoder = plan_.preset->addStream(*pipe_, stream.type);
     stream.module = encoder.name();
-    if (options_.fit) options_.fit(stream.type, stream.part.input, stream.part.stream, encoder);
+    const size_t known = !known_ ? 0 : stream.isVideo() ? known_->pictures.size() : known_->sounds.size();
+    if (options_.fit && static_cast<size_t>(stream.number) >= known)
+        options_.fit(stream.type, stream.part.input, stream.part.stream, encoder);
+    stream.set = options_.encoders.text(stream.type);
     setEncoder(encoder, stream.type, options_.encoders, plan_.output.name);
 }
 

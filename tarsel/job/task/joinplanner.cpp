@@ -5,6 +5,7 @@
 #include <optional>
 
 #include "tarsel/job/plan/filters.h"
+#include "tarsel/job/plan/inputfit.h"
 #include "tarsel/job/task/divide.h"
 #include "tarsel/words/messages.h"
 #include "tarsel/words/timespec.h"
@@ -126,7 +127,12 @@ void JoinPlanner::add(const SegmentWords& words, bool first, bool last) {
         segment.inputs.push_back(inputNumber(name));
         inputs.push_back(inputs_[static_cast<size_t>(segment.inputs.back())]);
     }
-    const PlanOptions options = optionsOf(words, inputs, first, last);
+    PlanOptions options = optionsOf(words, inputs, first, last);
+    if (fitsInputs(options))
+        options.fit = [&](int type, int input, int stream, QvEncoder& encoder) {
+            const auto source = open_(words.inputs[static_cast<size_t>(input)]);
+            fitEncoder(encoder, type, source->decoder(), stream, options_);
+        };
     segment.plan = planJob(options, form_, std::move(inputs), &known_);
     remember(segment.plan);
     join_.segments.push_back(std::move(segment));

@@ -11,9 +11,9 @@ namespace {
 
 bool has(const QvEncodePipe& pipe, int type) { return pipe.nrStreams(type) > 0; }
 
-bool isOn(const QvMuxer& muxer, const char* param) {
+bool isOn(const QvCodec& codec, const char* param) {
     try {
-        return muxer.QvCodec::getParam(param).isTrue();
+        return codec.getParam(param).isTrue();
     } catch (const QvParamException&) {  // not one of its parameters
         return false;
     }
@@ -72,6 +72,7 @@ PlannedStream plannedStream(JobPlan& plan, const TransLink& link, int input) {
     stream.picture = source.picture;
     stream.sound = source.sound;
     stream.isVideo() ? readPicture(encoder, stream.picture) : readSound(encoder, stream.sound);
+    if (stream.isVideo() && isOn(encoder, "twoPass")) stream.set = "two passes";
     const ProcessParams& params = link.processParams();
     readPoints(params, source.end(), stream);
     stream.hold = params.holdLast();

@@ -115,6 +115,8 @@ TEST_F(PluginPresets, IllFormedPairsAreIgnoredWithALine) {
     const std::string longName = repeated("x", 60) + "venc";
     modules.add(longName.c_str()).setAttr("compatMuxers", AnyVector(Any("webmmux")));
     modules.add("fakemux").setAttr("compatMuxers", AnyVector(Any("webmmux")));
+    qv_registry()->module("h264venc")->setAttr("compatEncoders", AnyVector(Any("rawvenc")));
+    qv_registry()->module("webmmux")->setAttr("compatEncoders", AnyVector(7, "rawvenc", "absent"));
     qv_registry()->module("av1venc")->setAttr("compatMuxers", "webmmux");
     qv_registry()->module("opusenc")->setAttr("compatMuxers", AnyVector(AnyDict(), 5, "webmmux", "webmmux"));
     LogCapture log;
@@ -123,7 +125,12 @@ TEST_F(PluginPresets, IllFormedPairsAreIgnoredWithALine) {
     EXPECT_TRUE(log.contains("'fakemux': 'compatMuxers' ignored: the module is no encoder"));
     EXPECT_TRUE(log.contains("'av1venc': 'compatMuxers' ignored: it is no vector"));
     EXPECT_EQ(log.count("'opusenc': an entry of 'compatMuxers' is no name"), 2);
+    EXPECT_TRUE(log.contains("'h264venc': 'compatEncoders' ignored: the module is no multiplexer"));
+    EXPECT_EQ(log.count("'webmmux': an entry of 'compatEncoders' is no name"), 1);
     EXPECT_TRUE(qvPresetMgr()->isCompatible("opusenc", "webmmux"));
+    EXPECT_TRUE(qvPresetMgr()->isCompatible("rawvenc", "webmmux"));
+    EXPECT_TRUE(qvPresetMgr()->isCompatible("rawvenc", "rawmux"));
+    EXPECT_FALSE(qvPresetMgr()->isCompatible("h264venc", "rawvenc"));
     EXPECT_FALSE(qvPresetMgr()->isCompatible("av1venc", "webmmux"));
 }
 
