@@ -27,7 +27,7 @@ inline constexpr auto muxerModules = std::to_array<MuxerModule>({
     {"dvavimux",  "AVI multiplexer",                 "AVI",            "avi"},
     {"y4mmux",    "YUV4MPEG2 multiplexer",           "YUV4MPEG2",      "y4m"},
     {"flacmux",   "FLAC file multiplexer",           "FLAC",           "flac"},
-    {"oggmux",    "Ogg multiplexer",                 "Ogg",            "ogg oga ogv opus"},
+    {"oggmux",    "Ogg multiplexer",                 "Ogg",            "ogg oga opus"},
 });
 // clang-format on
 

@@ -75,14 +75,18 @@ struct Container {
     std::uint32_t codecs;  // bits of codecBit
     int videos, sounds;    // streams at most
     PipeForm pipe;
-    unsigned words;            // bits of FilmWord
-    bool lengths;              // H.264 and H.265 with lengths, and their parameter sets in the header only
-    bool adts;                 // AAC keeps its ADTS headers
-    bool indexInFront;         // room for its index can be kept before the pictures
-    bool counted;              // streams start at 0 and have no times: sound before it is left out
-    bool pixels;               // its header says what the pixels are
-    bool bigPcm;               // PCM has the high byte first
-    bool statesDelay = false;  // of sound, in its header
+    unsigned words;             // bits of FilmWord
+    bool lengths;               // H.264 and H.265 with lengths, and their parameter sets in the header only
+    bool adts;                  // AAC keeps its ADTS headers
+    bool indexInFront;          // room for its index can be kept before the pictures
+    bool counted;               // streams start at 0 and have no times: sound before it is left out
+    bool pixels;                // its header says what the pixels are
+    bool bigPcm;                // PCM has the high byte first
+    bool statesDelay = false;   // of sound, in its header
+    std::uint32_t inOrder = 0;  // codecs whose pictures it can only hold in the order in which they are shown
+    const char* silent = nullptr;  // the libraries' format of it without sound, where that is another
+    const char* mpeg1 = nullptr;   // the same for pictures and sound of MPEG-1 alone
+    bool needsVideo = false;
 
     const MuxerModule& module() const;
     bool takes(MuxCodec codec) const { return (codecs & codecBit(codec)) != 0; }

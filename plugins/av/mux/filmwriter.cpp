@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <climits>
 #include <cstring>
+#include <functional>
 #include <utility>
 
 #include "core/engine/log/qvlog.h"
@@ -76,8 +77,18 @@ bool FilmWriter::beginIfReady() {
     return !ready || begin();
 }
 
+void FilmWriter::chooseFormat() {
+    const auto all = [this](auto is) { return std::all_of(tracks_.begin(), tracks_.end(), is); };
+    const auto old = [](const MuxTrack& track) {
+        return track.codec().codec == MuxCodec::mpeg1 || track.codec().codec == MuxCodec::mp2;
+    };
+    if (job_.container->silent && all(std::mem_fn(&MuxTrack::video))) job_.format = job_.container->silent;
+    if (job_.container->mpeg1 && all(old)) job_.format = job_.container->mpeg1;
+}
+
 bool FilmWriter::begin() {
     AVFormatContext* made = nullptr;
+    chooseFormat();
     int result = avformat_alloc_output_context2(&made, nullptr, job_.format, nullptr);
     film_.reset(made);
     if (result < 0) return failWith("the libraries do not have it", result);
@@ -85,7 +96,8 @@ bool FilmWriter::begin() {
     made->flags |= AVFMT_FLAG_CUSTOM_IO;
     made->flush_packets = 0;
     made->io_open = openNothing;
-    made->strict_std_compliance = FF_COMPLIANCE_UNOFFICIAL;
+    // What the libraries call experimental is the usual form by now: FLAC in MP4, deep colour in Y4M.
+    made->strict_std_compliance = FF_COMPLIANCE_EXPERIMENTAL;
     // Matroska shows from 0 on: what is before it is the priming that its header states.
     if (job_.container->statesDelay) made->avoid_negative_ts = AVFMT_AVOID_NEG_TS_DISABLED;
     for (MuxTrack& track : tracks_)

@@ -74,6 +74,7 @@ class FilmWriter {
     std::string problem_;
 
     bool beginIfReady();
+    void chooseFormat();
     bool begin();
     bool addStream(MuxTrack& track);
     void setOptions(AVDictionary** options);

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <climits>
 #include <cstring>
+#include <functional>
 
 #include "core/arch/qvassert.h"
 #include "core/engine/files/qvfileutil.h"
@@ -76,6 +77,8 @@ constexpr QvParamRow<Multiplexer> answerRows[] = {
      Answer{nullptr, [](const Multiplexer& m, Any& v) { v = codecs(m, QvModuleType::videoEncoder); }}},
     {"audioCodecs",
      Answer{nullptr, [](const Multiplexer& m, Any& v) { v = codecs(m, QvModuleType::audioEncoder); }}},
+    {"videoNecessary",
+     Answer{nullptr, [](const Multiplexer& m, Any& v) { v = m.container().needsVideo ? 1 : 0; }}},
     {"maxStreams", Answer{nullptr, [](const Multiplexer& m, Any& v) { v = limits(m); }}},
 };
 static_assert(qvParamTableOk<Multiplexer>(answerRows));
@@ -229,6 +232,9 @@ int Multiplexer::open() {
     for (const int type : {qvVideoStream, qvAudioStream})
         for (int nr = 0; nr < nrStreams(type); ++nr)
             if (const int result = describe(type, nr, *container, tracks)) return result;
+    const bool pictures = std::any_of(tracks.begin(), tracks.end(), std::mem_fn(&MuxTrack::video));
+    if (container->needsVideo && !pictures)
+        return setError(QvStatus::failed, "%s requires video stream", container->module().displayName);
     FilmJob job;
     job.container = container;
     job.format = format;

@@ -115,6 +115,9 @@ bool MuxTrack::describe(const QvWire::VideoHead& head) {
         return fail("there are no pictures of " + std::to_string(head.width) + "x" +
                     std::to_string(head.height));
     if (!choose(muxCodec(head.codec), head.codec)) return false;
+    if (head.delay > 0 && (container_->inOrder & codecBit(codec_->codec)) != 0)
+        return fail(std::string(container_->module().displayName) +
+                    " does not hold the order of B-frames of " + codec_->name + "; encode without them");
     AVCodecParameters& to = *parameters_;
     to.width = head.width;
     to.height = head.height;
@@ -292,12 +295,7 @@ bool MuxTrack::take(PacketPtr unit, std::vector<PacketPtr>& out) {
         unit->duration < 0)
         return fail("a unit has the time " + std::to_string(unit->pts));
     next_ = std::max(next_, unit->pts + unit->duration);
-    if (video_ || codec_->codec != MuxCodec::pcm || !container_->bigPcm) {
-    } else if (av_packet_make_writable(unit.get()) >= 0) {
-        const int bytes = sampleBytes_ / std::max(parameters_->ch_layout.nb_channels, 1);
-        for (int at = 0; at + bytes <= unit->size; at += bytes)
-            std::reverse(unit->data + at, unit->data + at + bytes);
-    }
+    if (!video_ && codec_->codec == MuxCodec::pcm && container_->bigPcm) return takeBigPcm(*unit, out);
     if (!filter_) return learn(*unit) && pass(std::move(unit), out);
     int result = av_bsf_send_packet(filter_.get(), unit.get());
     while (result >= 0) {
@@ -308,6 +306,26 @@ bool MuxTrack::take(PacketPtr unit, std::vector<PacketPtr>& out) {
         if (result >= 0 && !(learn(*made) && pass(std::move(made), out))) return false;
     }
     return fail(std::string("a unit is no ") + codec_->name + ": " + errorText(result));
+}
+
+// In pieces that fit into the buffer of a player of program streams, high bytes first.
+bool MuxTrack::takeBigPcm(AVPacket& unit, std::vector<PacketPtr>& out) {
+    constexpr int mostBytes = 1920;
+    const int width = sampleBytes_ / std::max(parameters_->ch_layout.nb_channels, 1);
+    const int step = std::max(mostBytes / sampleBytes_, 1) * sampleBytes_;
+    if (av_packet_make_writable(&unit) < 0) return fail("there is no memory for a unit");
+    for (int at = 0; at + width <= unit.size; at += width)
+        std::reverse(unit.data + at, unit.data + at + width);
+    for (int at = 0; at < unit.size; at += step) {
+        PacketPtr part(av_packet_clone(&unit));
+        if (!part) return fail("there is no memory for a unit");
+        part->data += at;
+        part->size = std::min(step, unit.size - at);
+        part->pts = part->dts = unit.pts + at / sampleBytes_;
+        part->duration = part->size / sampleBytes_;
+        if (!pass(std::move(part), out)) return false;
+    }
+    return true;
 }
 
 bool MuxTrack::pass(PacketPtr unit, std::vector<PacketPtr>& out) {

@@ -81,6 +81,7 @@ class MuxTrack {
     void choosePcm(int bits);
     void chooseTag(int profile);
     bool learn(AVPacket& unit);
+    bool takeBigPcm(AVPacket& unit, std::vector<PacketPtr>& out);
     bool pass(PacketPtr unit, std::vector<PacketPtr>& out);
     bool hold(PacketPtr unit, std::vector<PacketPtr>& out);
     bool addOwnData(std::vector<PacketPtr>& out);
