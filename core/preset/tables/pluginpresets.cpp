@@ -133,29 +133,49 @@ std::vector<PluginPreset> qvPluginPresets(const AnyVector& taken, const CodecCom
     return found;
 }
 
+namespace {
+
+// One attribute of a module that lists modules of the other side. Nothing for one that is absent or
+// ill-formed.
+AnyVector partners(const QvModule& module, const char* attribute, const char* expected, bool isOne) {
+    const Any listed = module.getAttr(attribute);
+    if (!listed.isValid()) return {};
+    const std::string name = module.name();
+    // A longer name would be cut in the list and stand for another module.
+    const bool fits = name.size() <= AnyDict::maxKeyLength;
+    if (!listed.isVector() || !isOne || !fits) {
+        const std::string other = std::string("the module is no ") + expected;
+        qv_dbg()->warning("[Preset] Module '%s': '%s' ignored: %s", name.c_str(), attribute,
+                          !listed.isVector() ? "it is no vector"
+                          : !isOne           ? other.c_str()
+                                             : "the module's name is too long");
+        return {};
+    }
+    AnyVector names;
+    for (const Any& entry : listed.asVector())
+        if (entry.isText())
+            names.append(entry.toString());
+        else
+            qv_dbg()->warning("[Preset] Module '%s': an entry of '%s' is no name", name.c_str(), attribute);
+    return names;
+}
+
+}  // namespace
+
 void qvAddPluginPairs(CodecCompat& pairs, const InstalledModules& installed) {
     const QvRegistry& registry = *qv_registry();
     for (int i = 0, n = registry.nrModules(); i < n; ++i) {
         const QvModule& module = *registry.module(i);
-        const Any muxers = module.getAttr("compatMuxers");
-        if (!muxers.isValid()) continue;
         const std::string name = module.name();
-        // A longer name would be cut in the list and stand for another module.
-        const bool fits = name.size() <= AnyDict::maxKeyLength;
-        if (!muxers.isVector() || !isEncoder(module) || !fits) {
-            qv_dbg()->warning("[Preset] Module '%s': 'compatMuxers' ignored: %s", name.c_str(),
-                              !muxers.isVector()   ? "it is no vector"
-                              : !isEncoder(module) ? "the module is no encoder"
-                                                   : "the module's name is too long");
-            continue;
-        }
-        pairs.addCodec(name.c_str());
-        for (const Any& muxer : muxers.asVector()) {
-            if (!muxer.isText())
-                qv_dbg()->warning("[Preset] Module '%s': an entry of 'compatMuxers' is no name",
-                                  name.c_str());
-            else if (const Any narrow = muxer.toString(); installed.has(narrow.asString("")))
-                pairs.add(name.c_str(), narrow.asString(""));
+        const AnyVector muxers = partners(module, "compatMuxers", "encoder", isEncoder(module));
+        if (muxers.size() > 0) pairs.addCodec(name.c_str());
+        for (const Any& muxer : muxers)
+            if (installed.has(muxer.asString(""))) pairs.add(name.c_str(), muxer.asString(""));
+        for (const Any& codec : partners(module, "compatCodecs", "multiplexer",
+                                         module.getAttr("type").asInt32(0) == QvModuleType::muxer)) {
+            if (!installed.has(codec.asString(""))) continue;
+            pairs.addCodec(codec.asString(""));
+            pairs.add(codec.asString(""), name.c_str());
         }
     }
 }

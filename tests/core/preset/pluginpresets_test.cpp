@@ -127,6 +127,19 @@ TEST_F(PluginPresets, IllFormedPairsAreIgnoredWithALine) {
     EXPECT_FALSE(qvPresetMgr()->isCompatible("av1venc", "webmmux"));
 }
 
+TEST_F(PluginPresets, MultiplexersNameEncodersToo) {
+    qv_registry()->module("webmmux")->setAttr("compatCodecs", AnyVector("av1venc", "rawaenc", "absent", 5));
+    qv_registry()->module("opusenc")->setAttr("compatCodecs", AnyVector(Any("webmmux")));
+    LogCapture log;
+    qvPresetMgr()->update();
+    EXPECT_TRUE(qvPresetMgr()->isCompatible("av1venc", "webmmux"));
+    EXPECT_TRUE(qvPresetMgr()->isCompatible("rawaenc", "webmmux"));
+    EXPECT_TRUE(qvPresetMgr()->isCompatible("rawaenc", "rawmux"));
+    EXPECT_FALSE(qvPresetMgr()->isCompatible("absent", "webmmux"));
+    EXPECT_TRUE(log.contains("'webmmux': an entry of 'compatCodecs' is no name"));
+    EXPECT_TRUE(log.contains("'opusenc': 'compatCodecs' ignored: the module is no multiplexer"));
+}
+
 // An encoder without its hardware, and a multiplexer that can't be made; each comes first in the list.
 TEST_F(PluginPresets, PipesBeginWithTheRawPresetWhereTheFirstCantBeMade) {
     struct Unmade : QvModule {
