@@ -68,7 +68,7 @@ constexpr auto containers = std::to_array<Container>({
     {"avi",          codecBits(dv, mpeg4, mjpeg, ffv1, raw, mp2, mp3, ac3, pcm), 8, 32, PipeForm::none,
          title | commonTags | language,                          false, true,  false, true,   false, false, false, codecBit(mpeg4)},
     {"yuv4mpegpipe", codecBits(raw),                                             1, 0,  PipeForm::same,
-         0,                                                      false, false, false, true,   true,  false, false, 0, nullptr, nullptr, true},
+         0,                                                      false, false, false, true,   true,  false, false, 0, nullptr, nullptr, true, true},
     {"flac",         codecBits(flac),                                            0, 1,  PipeForm::same,
          title | commonTags | allTags,                           false, false, false, true,   false, false},
     {"ogg",          codecBits(flac, opus, vorbis),                              0, 8,  PipeForm::same,

@@ -87,6 +87,7 @@ struct Container {
     const char* silent = nullptr;  // the libraries' format of it without sound, where that is another
     const char* mpeg1 = nullptr;   // the same for pictures and sound of MPEG-1 alone
     bool needsVideo = false;
+    bool wrapsPictures = false;  // raw ones go to the libraries as their frames
 
     const MuxerModule& module() const;
     bool takes(MuxCodec codec) const { return (codecs & codecBit(codec)) != 0; }

@@ -4,6 +4,7 @@
 #include <climits>
 #include <cstring>
 #include <functional>
+#include <string_view>
 #include <utility>
 
 #include "core/engine/log/qvlog.h"
@@ -15,6 +16,19 @@ namespace av {
 namespace {
 
 int openNothing(AVFormatContext*, AVIOContext**, const char*, int, AVDictionary**) { return AVERROR(EPERM); }
+
+// Two of the codes of ISO 639-2 stand for one language. QuickTime's list has the older ones.
+std::string languageFor(const char* format, const std::string& language) {
+    static constexpr std::pair<std::string_view, std::string_view> older[] = {
+        {"deu", "ger"}, {"nld", "dut"}, {"ces", "cze"}, {"zho", "chi"}, {"ell", "gre"}, {"fas", "per"},
+        {"ron", "rum"}, {"slk", "slo"}, {"sqi", "alb"}, {"hye", "arm"}, {"eus", "baq"}, {"mya", "bur"},
+        {"kat", "geo"}, {"isl", "ice"}, {"mkd", "mac"}, {"msa", "may"}, {"bod", "tib"}, {"cym", "wel"},
+    };
+    if (std::string_view(format) != "mov") return language;
+    for (const auto& [code, old] : older)
+        if (language == code) return std::string(old);
+    return language;
+}
 
 }  // namespace
 
@@ -131,7 +145,7 @@ bool FilmWriter::addStream(MuxTrack& track) {
                        })->place() == track.place();
     if (first) stream->disposition |= AV_DISPOSITION_DEFAULT;
     if (!track.language.empty() && (job_.container->words & FilmWord::language))
-        av_dict_set(&stream->metadata, "language", track.language.c_str(), 0);
+        av_dict_set(&stream->metadata, "language", languageFor(job_.format, track.language).c_str(), 0);
     if (!track.title.empty() && (job_.container->words & FilmWord::commonTags))
         av_dict_set(&stream->metadata, "title", track.title.c_str(), 0);
     return true;

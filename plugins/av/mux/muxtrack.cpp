@@ -235,8 +235,8 @@ bool MuxTrack::describeRaw(const QvCodec& encoder) {
         return fail("there are no pictures of " + std::to_string(to.width) + "x" + std::to_string(to.height));
     pictureBytes_ = frame.total_bytes();
     codec_ = &muxCodecRow(MuxCodec::raw);
-    to.codec_id = form->codec;
-    to.codec_tag = form->tag;
+    to.codec_id = container_->wrapsPictures ? AV_CODEC_ID_WRAPPED_AVFRAME : form->codec;
+    to.codec_tag = container_->wrapsPictures ? 0 : form->tag;
     to.format = form->pixels;
     rate_ = {static_cast<int>(ratio.num), static_cast<int>(ratio.den)};
     timeBase_ = {rate_.den, rate_.num};
@@ -291,10 +291,14 @@ bool MuxTrack::learn(AVPacket& unit) {
 
 bool MuxTrack::take(PacketPtr unit, std::vector<PacketPtr>& out) {
     if (unit->pts == AV_NOPTS_VALUE) unit->pts = unit->dts = next_;
-    if (unit->pts < -std::int64_t{parameters_->initial_padding} || unit->pts > 1LL << 48 ||
-        unit->duration < 0)
+    if ((!video_ && unit->pts < -std::int64_t{parameters_->initial_padding}) || unit->dts < -(1LL << 48) ||
+        unit->pts < -(1LL << 48) || unit->pts > 1LL << 48 || unit->duration < 0)
         return fail("a unit has the time " + std::to_string(unit->pts));
+    if (video_ && (unit->pts < unit->dts || (last_ != AV_NOPTS_VALUE && unit->dts <= last_)))
+        return fail("a unit is to be decoded at " + std::to_string(unit->dts) + ", out of order");
+    last_ = unit->dts;
     next_ = std::max(next_, unit->pts + unit->duration);
+    if (parameters_->codec_id == AV_CODEC_ID_WRAPPED_AVFRAME && !wrap(*unit)) return false;
     if (!video_ && codec_->codec == MuxCodec::pcm && container_->bigPcm) return takeBigPcm(*unit, out);
     if (!filter_) return learn(*unit) && pass(std::move(unit), out);
     int result = av_bsf_send_packet(filter_.get(), unit.get());
@@ -306,6 +310,30 @@ bool MuxTrack::take(PacketPtr unit, std::vector<PacketPtr>& out) {
         if (result >= 0 && !(learn(*made) && pass(std::move(made), out))) return false;
     }
     return fail(std::string("a unit is no ") + codec_->name + ": " + errorText(result));
+}
+
+// The library's form of pictures that are not coded: the data of the unit is a frame.
+bool MuxTrack::wrap(AVPacket& unit) {
+    FramePtr frame(av_frame_alloc());
+    if (!frame) return fail("there is no memory for a picture");
+    frame->format = parameters_->format;
+    frame->width = parameters_->width;
+    frame->height = parameters_->height;
+    av_image_fill_arrays(frame->data, frame->linesize, unit.data, static_cast<AVPixelFormat>(frame->format),
+                         frame->width, frame->height, 1);
+    std::swap(frame->buf[0], unit.buf);
+    auto* const data = reinterpret_cast<std::uint8_t*>(frame.get());
+    const auto release = [](void*, std::uint8_t* wrapped) {
+        const FramePtr owner(reinterpret_cast<AVFrame*>(wrapped));
+    };
+    unit.data = nullptr;
+    unit.size = 0;
+    unit.buf = av_buffer_create(data, sizeof(AVFrame), release, nullptr, 0);
+    if (!unit.buf) return fail("there is no memory for a picture");
+    frame.release();
+    unit.data = data;
+    unit.size = sizeof(AVFrame);
+    return true;
 }
 
 // In pieces that fit into the buffer of a player of program streams, high bytes first.
