@@ -112,8 +112,6 @@ bool FilmWriter::begin() {
     made->io_open = openNothing;
     // What the libraries call experimental is the usual form by now: FLAC in MP4, deep colour in Y4M.
     made->strict_std_compliance = FF_COMPLIANCE_EXPERIMENTAL;
-    // Matroska shows from 0 on: what is before it is the priming that its header states.
-    if (job_.container->statesDelay) made->avoid_negative_ts = AVFMT_AVOID_NEG_TS_DISABLED;
     for (MuxTrack& track : tracks_)
         if (!addStream(track)) return failWith("a stream could not be made", AVERROR(ENOMEM));
     const std::string lost = setFilmWords(*made, *job_.container, job_.meta, seconds());
@@ -176,7 +174,7 @@ long long FilmWriter::indexBytes() const {
 
 void FilmWriter::setOptions(AVDictionary** options) {
     const Container& container = *job_.container;
-    if (container.indexInFront) {
+    if (container.is(MuxTrait::indexInFront)) {
         const bool pipe = !job_.seekable;
         av_dict_set(options, "movflags",
                     pipe ? "+write_colr+frag_keyframe+delay_moov+default_base_moof" : "+write_colr", 0);
@@ -190,7 +188,12 @@ void FilmWriter::setOptions(AVDictionary** options) {
         if (av_dict_get(film_->metadata, "timecode", nullptr, 0)) av_dict_set(options, "write_tmcd", "1", 0);
     }
     if (!job_.seekable && container.pipe == PipeForm::live) av_dict_set(options, "live", "1", 0);
-    if (job_.extension == "m2ts" || job_.extension == "mts") av_dict_set(options, "mpegts_m2ts_mode", "1", 0);
+    // Packets with a time before each are those of disks, which have no other sound.
+    const bool disk = std::none_of(tracks_.begin(), tracks_.end(), [](const MuxTrack& track) {
+        return !track.video() && track.codec().codec != MuxCodec::ac3 && track.codec().codec != MuxCodec::eac3;
+    });
+    if (disk && (job_.extension == "m2ts" || job_.extension == "mts"))
+        av_dict_set(options, "mpegts_m2ts_mode", "1", 0);
     AVDictionary* own = nullptr;
     parseMuxOptions(job_.options, job_.format, &own);
     const AVDictionaryEntry* entry = nullptr;

@@ -77,8 +77,8 @@ constexpr QvParamRow<Multiplexer> answerRows[] = {
      Answer{nullptr, [](const Multiplexer& m, Any& v) { v = codecs(m, QvModuleType::videoEncoder); }}},
     {"audioCodecs",
      Answer{nullptr, [](const Multiplexer& m, Any& v) { v = codecs(m, QvModuleType::audioEncoder); }}},
-    {"videoNecessary",
-     Answer{nullptr, [](const Multiplexer& m, Any& v) { v = m.container().needsVideo ? 1 : 0; }}},
+    {"videoNecessary", Answer{nullptr, [](const Multiplexer& m,
+                                          Any& v) { v = m.container().is(MuxTrait::needsVideo) ? 1 : 0; }}},
     {"maxStreams", Answer{nullptr, [](const Multiplexer& m, Any& v) { v = limits(m); }}},
 };
 static_assert(qvParamTableOk<Multiplexer>(answerRows));
@@ -233,7 +233,7 @@ int Multiplexer::open() {
         for (int nr = 0; nr < nrStreams(type); ++nr)
             if (const int result = describe(type, nr, *container, tracks)) return result;
     const bool pictures = std::any_of(tracks.begin(), tracks.end(), std::mem_fn(&MuxTrack::video));
-    if (container->needsVideo && !pictures)
+    if (container->is(MuxTrait::needsVideo) && !pictures)
         return setError(QvStatus::failed, "%s requires video stream", container->module().displayName);
     FilmJob job;
     job.container = container;

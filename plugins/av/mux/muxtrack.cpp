@@ -29,13 +29,17 @@ struct RawForm {
     unsigned fourcc;
     AVCodecID codec;
     AVPixelFormat pixels;
-    unsigned tag;  // of the library; 0: its own choice
+    unsigned tag;        // of the library; 0: its own choice
+    unsigned boxed = 0;  // tag in QuickTime
 };
 constexpr RawForm rawForms[] = {
     {QvFourcc::I420, AV_CODEC_ID_RAWVIDEO, AV_PIX_FMT_YUV420P, MKTAG('I', '4', '2', '0')},
-    {QvFourcc::YUYV, AV_CODEC_ID_RAWVIDEO, AV_PIX_FMT_YUYV422, 0},
-    {QvFourcc::YUY2, AV_CODEC_ID_RAWVIDEO, AV_PIX_FMT_YUYV422, 0},
-    {QvFourcc::UYVY, AV_CODEC_ID_RAWVIDEO, AV_PIX_FMT_UYVY422, 0},
+    {QvFourcc::YUYV, AV_CODEC_ID_RAWVIDEO, AV_PIX_FMT_YUYV422, MKTAG('Y', 'U', 'Y', '2'),
+     MKTAG('y', 'u', 'v', 's')},
+    {QvFourcc::YUY2, AV_CODEC_ID_RAWVIDEO, AV_PIX_FMT_YUYV422, MKTAG('Y', 'U', 'Y', '2'),
+     MKTAG('y', 'u', 'v', 's')},
+    {QvFourcc::UYVY, AV_CODEC_ID_RAWVIDEO, AV_PIX_FMT_UYVY422, MKTAG('U', 'Y', 'V', 'Y'),
+     MKTAG('2', 'v', 'u', 'y')},
     {QvFourcc::W016, AV_CODEC_ID_RAWVIDEO, AV_PIX_FMT_YUV420P16LE, 0},
     {QvFourcc::v210, AV_CODEC_ID_V210, AV_PIX_FMT_YUV422P10LE, 0},
 };
@@ -142,12 +146,13 @@ bool MuxTrack::describe(const QvWire::VideoHead& head) {
                        head.extradataBytes > 0 && head.extradata &&
                        *static_cast<const std::uint8_t*>(head.extradata) == 1;
     if (!boxed && !setOwnData(head.extradata, head.extradataBytes)) return false;
-    awaitsUnit_ = (codec_->setsInBand && container_->lengths && to.extradata_size == 0) || container_->pixels;
+    awaitsUnit_ = (codec_->setsInBand && container_->is(MuxTrait::lengths) && to.extradata_size == 0) ||
+                  container_->is(MuxTrait::pixels);
     return makeFilter();
 }
 
 void MuxTrack::chooseTag(int profile) {
-    const bool boxes = container_->indexInFront;
+    const bool boxes = container_->is(MuxTrait::indexInFront);
     if (codec_->codec == MuxCodec::hevc && boxes)
         parameters_->codec_tag = MKTAG('h', 'v', 'c', '1');
     else if (codec_->codec == MuxCodec::prores && profile >= 0 &&
@@ -184,7 +189,7 @@ bool MuxTrack::describe(const QvWire::AudioHead& head) {
     to.profile = head.profile >= 0 ? head.profile : FF_PROFILE_UNKNOWN;
     if (codec_->codec == MuxCodec::pcm) choosePcm(head.bits);
     if (!setOwnData(head.extradata, head.extradataBytes)) return false;
-    awaitsUnit_ = codec_->setsInBand && container_->lengths && to.extradata_size == 0;
+    awaitsUnit_ = codec_->setsInBand && container_->is(MuxTrait::lengths) && to.extradata_size == 0;
     return makeFilter();
 }
 
@@ -195,7 +200,7 @@ void MuxTrack::choosePcm(int bits) {
                                    AV_CODEC_ID_PCM_S32LE};
     constexpr std::array big = {AV_CODEC_ID_PCM_U8, AV_CODEC_ID_PCM_S16BE, AV_CODEC_ID_PCM_S24BE,
                                 AV_CODEC_ID_PCM_S32BE};
-    to.codec_id = (container_->bigPcm ? big : little)[static_cast<std::size_t>(bytes - 1)];
+    to.codec_id = (container_->is(MuxTrait::bigPcm) ? big : little)[static_cast<std::size_t>(bytes - 1)];
     to.bits_per_coded_sample = bytes * 8;
     to.block_align = sampleBytes_ = bytes * to.ch_layout.nb_channels;
     to.bit_rate = std::int64_t{8} * to.block_align * to.sample_rate;
@@ -235,8 +240,9 @@ bool MuxTrack::describeRaw(const QvCodec& encoder) {
         return fail("there are no pictures of " + std::to_string(to.width) + "x" + std::to_string(to.height));
     pictureBytes_ = frame.total_bytes();
     codec_ = &muxCodecRow(MuxCodec::raw);
-    to.codec_id = container_->wrapsPictures ? AV_CODEC_ID_WRAPPED_AVFRAME : form->codec;
-    to.codec_tag = container_->wrapsPictures ? 0 : form->tag;
+    to.codec_id = container_->is(MuxTrait::wrapsPictures) ? AV_CODEC_ID_WRAPPED_AVFRAME : form->codec;
+    const bool boxes = container_->is(MuxTrait::indexInFront);
+    to.codec_tag = container_->is(MuxTrait::wrapsPictures) ? 0 : boxes ? form->boxed : form->tag;
     to.format = form->pixels;
     rate_ = {static_cast<int>(ratio.num), static_cast<int>(ratio.den)};
     timeBase_ = {rate_.den, rate_.num};
@@ -252,9 +258,9 @@ bool MuxTrack::makeFilter() {
     const char* name = nullptr;
     const char* options = nullptr;
     const MuxCodec codec = codec_->codec;
-    if (container_->lengths && (codec == MuxCodec::h264 || codec == MuxCodec::hevc))
+    if (container_->is(MuxTrait::lengths) && (codec == MuxCodec::h264 || codec == MuxCodec::hevc))
         name = "extract_extradata", options = "1";
-    else if (codec == MuxCodec::aac && !container_->adts)
+    else if (codec == MuxCodec::aac && !container_->is(MuxTrait::adts))
         name = "aac_adtstoasc";
     else if (codec_->setsInBand && awaitsUnit_ && codec != MuxCodec::aac)
         name = "extract_extradata";
@@ -280,10 +286,11 @@ bool MuxTrack::learn(AVPacket& unit) {
         av_packet_free_side_data(&unit);
     }
     if (!awaitsUnit_) return true;
-    if (container_->pixels && video_ && parameters_->format < 0) probePixels(*parameters_, unit);
+    if (container_->is(MuxTrait::pixels) && video_ && parameters_->format < 0)
+        probePixels(*parameters_, unit);
     const bool needs =
         codec_->codec == MuxCodec::h264 || codec_->codec == MuxCodec::hevc || codec_->codec == MuxCodec::aac;
-    if (needs && container_->lengths && parameters_->extradata_size == 0)
+    if (needs && container_->is(MuxTrait::lengths) && parameters_->extradata_size == 0)
         return fail(std::string("the first unit of ") + codec_->name + " has no parameters of its own");
     awaitsUnit_ = false;
     return true;
@@ -299,7 +306,8 @@ bool MuxTrack::take(PacketPtr unit, std::vector<PacketPtr>& out) {
     last_ = unit->dts;
     next_ = std::max(next_, unit->pts + unit->duration);
     if (parameters_->codec_id == AV_CODEC_ID_WRAPPED_AVFRAME && !wrap(*unit)) return false;
-    if (!video_ && codec_->codec == MuxCodec::pcm && container_->bigPcm) return takeBigPcm(*unit, out);
+    if (!video_ && codec_->codec == MuxCodec::pcm && container_->is(MuxTrait::bigPcm))
+        return takeBigPcm(*unit, out);
     if (!filter_) return learn(*unit) && pass(std::move(unit), out);
     int result = av_bsf_send_packet(filter_.get(), unit.get());
     while (result >= 0) {
@@ -364,7 +372,7 @@ bool MuxTrack::pass(PacketPtr unit, std::vector<PacketPtr>& out) {
 
 // The last unit of sound may be heard in part only, which is known at the end.
 bool MuxTrack::hold(PacketPtr unit, std::vector<PacketPtr>& out) {
-    if (container_->counted && unit->pts + unit->duration <= 0) return true;
+    if (container_->is(MuxTrait::counted) && unit->pts + unit->duration <= 0) return true;
     if (held_) out.push_back(std::move(held_));
     held_ = std::move(unit);
     return true;

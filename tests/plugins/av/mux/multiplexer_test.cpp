@@ -163,7 +163,7 @@ TEST_F(EveryContainer, takesEachCodecOfItsRowAndNamesTheOthers) {
                 const bool ordered =
                     film.streams[0].picture.delay > 0 &&
                     (container.inOrder & av::codecBit(av::muxCodec(film.streams[0].picture.codec)->codec));
-                if (!takes || ordered || (!video && container.needsVideo)) {
+                if (!takes || ordered || (!video && container.is(av::MuxTrait::needsVideo))) {
                     EXPECT_FALSE(problem.empty());
                     continue;
                 }
