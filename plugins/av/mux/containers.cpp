@@ -74,7 +74,7 @@ constexpr auto containers = std::to_array<Container>({
          adts | bigPcm, 0, nullptr, "mpeg"},
     {"dv",           codecBits(dv, pcm),                                            1, 4,  PipeForm::same,
          timecode,
-         counted | needsVideo, 0, "rawvideo"},
+         counted | needsVideo | pixels, 0, "rawvideo"},
     {"avi",          codecBits(dv, mpeg4, mjpeg, ffv1, raw, mp2, mp3, ac3, pcm),    8, 32, PipeForm::none,
          title | commonTags | language,
          adts | counted, codecBit(mpeg4)},

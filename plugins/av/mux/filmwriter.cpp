@@ -190,7 +190,8 @@ void FilmWriter::setOptions(AVDictionary** options) {
     if (!job_.seekable && container.pipe == PipeForm::live) av_dict_set(options, "live", "1", 0);
     // Packets with a time before each are those of disks, which have no other sound.
     const bool disk = std::none_of(tracks_.begin(), tracks_.end(), [](const MuxTrack& track) {
-        return !track.video() && track.codec().codec != MuxCodec::ac3 && track.codec().codec != MuxCodec::eac3;
+        return !track.video() && track.codec().codec != MuxCodec::ac3 &&
+               track.codec().codec != MuxCodec::eac3;
     });
     if (disk && (job_.extension == "m2ts" || job_.extension == "mts"))
         av_dict_set(options, "mpegts_m2ts_mode", "1", 0);

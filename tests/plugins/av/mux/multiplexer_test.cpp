@@ -262,6 +262,37 @@ TEST_F(FilmWithSound, startsAndEndsAtTheSameTimeInEveryForm) {
     EXPECT_EQ(TempFolder::read(folder.file("b.mp4")).find("mfra") == std::string::npos, false);
 }
 
+// Containers that take sound only beside pictures.
+TEST_F(Multiplexers, carryPcmBesidePictures) {
+    const struct {
+        const char *module, *name;
+        Words pictures;
+    } cases[] = {
+        {"mxfmux", "a.mxf", {"-c:v", "mpeg2video", "-bf", "2", "-g", "12"}},
+        {"dvmux", "b.dv", {"-s", "720x576", "-pix_fmt", "yuv420p", "-c:v", "dvvideo"}},
+        {"dvavimux", "c.avi", {"-s", "720x576", "-pix_fmt", "yuv420p", "-c:v", "dvvideo"}},
+        {"mpegpsmux", "d.mpg", {"-c:v", "mpeg2video", "-bf", "2", "-g", "12"}},
+    };
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.name);
+        const std::string from = folder.file("from.mov"), to = folder.file(c.name);
+        Words words = {"-f",   "lavfi",    "-i", kMoving,
+                       "-f",   "lavfi",    "-i", "aevalsrc=sin(440*2*PI*t*t)|sin(300*t*t):s=48000:d=2",
+                       "-c:a", "pcm_s16le"};
+        words.insert(words.end(), c.pictures.begin(), c.pictures.end());
+        words.push_back(from);
+        const Outcome made = ffmpeg(words);
+        ASSERT_EQ(made.status, 0) << made.err;
+        UnitSender film(from);
+        ASSERT_EQ(mux(c.module, film, to, AnyDict("meta", AnyDict("timecode", "10:00:00:00"))), "");
+        EXPECT_TRUE(decoded(to, "v") == decoded(from, "v"));
+        EXPECT_TRUE(samples(to) == samples(from)) << samples(to).size() << " of " << samples(from).size();
+        if (c.module != std::string("mxfmux")) continue;
+        const Outcome shown = runProgram({"/usr/bin/env", "ffprobe", "-v", "error", "-show_format", to});
+        EXPECT_THAT(shown.out, HasSubstr("timecode=10:00:00:00"));
+    }
+}
+
 // More units than were announced: the index is at the end, and the film is whole.
 TEST_F(FilmWithSound, hasItsIndexAtTheEndWhereItsSpaceIsTooSmall) {
     ASSERT_EQ(ffmpeg({"-f", "lavfi", "-i", "testsrc2=size=16x16:rate=100:duration=60", "-c:v", "libx264",
