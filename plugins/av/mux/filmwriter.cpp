@@ -43,7 +43,11 @@ FilmWriter::FilmWriter(QvBufStream& output, FilmJob job, std::vector<MuxTrack> t
 FilmWriter::~FilmWriter() = default;
 
 bool FilmWriter::fail(const std::string& problem) {
-    if (problem_.empty()) problem_ = problem.empty() ? "Multiplexing failed" : problem;
+    const std::lock_guard lock(lock_);
+    if (!failed_) {
+        problem_ = problem;
+        failed_ = true;
+    }
     return false;
 }
 

@@ -56,8 +56,9 @@ class Multiplexers : public Films {
     }
     // Hashes of the decoded pictures or samples, one a line, and the times of the pictures in frames.
     std::string decoded(const std::string& film, const char* kind) const {
-        const Outcome read = ffmpeg({"-i", film, "-map", std::string("0:") + kind, "-fps_mode", "passthrough",
-                                     "-f", *kind == 'v' ? "framehash" : "hash", "-"});
+        const Outcome read =
+            ffmpeg({"-threads", "1", "-i", film, "-map", std::string("0:") + kind, "-fps_mode", "passthrough",
+                    "-f", *kind == 'v' ? "framehash" : "hash", "-"});
         EXPECT_EQ(read.status, 0) << film << read.err;
         std::string hashes;
         std::istringstream lines(read.out);
@@ -189,6 +190,20 @@ TEST_F(EveryContainer, takesEachCodecOfItsRowAndNamesTheOthers) {
                 }
             }
         }
+}
+
+// FLAC's length and digest are known at the end.
+TEST_F(EveryContainer, hasTheOwnDataOfACodecAsTheyBecame) {
+    const std::string from = make(kSounds[5], false);
+    for (const char* name : {"flacmux x.flac", "mkvmux x.mkv", "mp4mux x.mp4"}) {
+        UnitSender film(from);
+        std::string& data = film.streams[0].finalData = film.streams[0].extradata;
+        ASSERT_EQ(data.size(), 34u);
+        data.replace(18, 16, "a digest of sums");
+        const std::string module(name, std::strchr(name, ' ')), to = folder.file(std::strchr(name, ' ') + 1);
+        ASSERT_EQ(mux(module, film, to), "");
+        EXPECT_THAT(TempFolder::read(to), HasSubstr(data)) << name;
+    }
 }
 
 // H.264 with B-frames and AAC with priming.

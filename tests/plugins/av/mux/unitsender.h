@@ -38,7 +38,7 @@ class UnitSender {
     };
     struct Stream {
         bool video = false;
-        std::string fourcc, extradata;
+        std::string fourcc, extradata, finalData;
         QvWire::VideoHead picture{};
         QvWire::AudioHead sound{};
         AVRational base{};
@@ -88,7 +88,8 @@ class UnitSender {
         for (std::size_t i = 0; i < units.size() && i < count; ++i)
             if (!sendUnit(units[i])) return false;
         for (Stream& stream : streams)  // as an encoder's close, which knows what is left at the end
-            if (stream.sound.trailingPadding > 0 && !sendHead(stream)) return false;
+            if ((stream.sound.trailingPadding > 0 || changeOwnData(stream)) && !sendHead(stream))
+                return false;
         return true;
     }
     bool sendUnit(Unit& unit) {
@@ -115,6 +116,12 @@ class UnitSender {
         QvWire::AudioUnit record{bytes, static_cast<std::uint32_t>(unit.duration) | QvWire::unitTimed,
                                  unit.pts};
         return tell(stream, QvAuxId::AUDIO_AU_CODE, record);
+    }
+    static bool changeOwnData(Stream& stream) {
+        if (stream.finalData.empty()) return false;
+        stream.sound.extradata = stream.finalData.data();
+        stream.sound.extradataBytes = stream.finalData.size();
+        return true;
     }
     // Stands for all encoders going: the streams know no writer any more.
     void detach() {
