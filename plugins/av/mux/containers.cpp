@@ -115,6 +115,16 @@ const MuxCodecRow* muxCodec(std::uint32_t fourcc) {
     return nullptr;
 }
 
+std::uint32_t muxFourcc(AVCodecID id) {
+    for (const MuxCodecRow& row : codecRows) {
+        if (row.id != id || std::strlen(row.fourccs) < 4) continue;
+        std::uint32_t fourcc = 0;
+        for (int i = 3; i >= 0; --i) fourcc = fourcc << 8 | static_cast<unsigned char>(row.fourccs[i]);
+        return fourcc;
+    }
+    return 0;
+}
+
 const MuxCodecRow& muxCodecRow(MuxCodec codec) { return codecRows[static_cast<std::size_t>(codec)]; }
 
 const MuxerModule& Container::module() const {

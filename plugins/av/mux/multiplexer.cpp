@@ -13,6 +13,7 @@
 #include "core/engine/status.h"
 #include "core/measure/qvgeometry.h"
 #include "core/preset/qvpresetmgr.h"
+#include "plugins/av/mux/filefeed.h"
 #include "plugins/av/mux/filmcheck.h"
 #include "plugins/av/mux/filmwriter.h"
 #include "plugins/av/mux/muxoptions.h"
@@ -308,7 +309,9 @@ void Multiplexer::end() {
 }
 
 int Multiplexer::muxElementaryStreams(QvFileMuxConfig& config, QvBufStream& output) {
-    return BaseMuxer::muxElementaryStreams(config, output);
+    std::string error;
+    const int result = muxFiles(*this, config, output, error);
+    return result < 0 ? setError(result, "%s", error.c_str()) : result;
 }
 
 QvCodec* newMultiplexer(const char* module) {

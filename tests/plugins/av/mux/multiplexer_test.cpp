@@ -7,6 +7,7 @@
 #include <span>
 #include <sstream>
 
+#include "core/encode/qvfilemux.h"
 #include "core/encode/qvsink.h"
 #include "core/measure/fourcc.h"
 #include "core/measure/mediatime.h"
@@ -310,6 +311,47 @@ TEST_F(Multiplexers, carryPcmBesidePictures) {
         if (c.module != std::string("mxfmux")) continue;
         const Outcome shown = runProgram({"/usr/bin/env", "ffprobe", "-v", "error", "-show_format", to});
         EXPECT_THAT(shown.out, HasSubstr("timecode=10:00:00:00"));
+    }
+}
+
+TEST_F(FilmWithSound, isMadeOfElementaryStreams) {
+    for (const char* codec : {"h264 libx264", "h265 libx265", "m2v mpeg2video"}) {
+        SCOPED_TRACE(codec);
+        const std::string extension(codec, std::strchr(codec, ' ')), encoder = std::strchr(codec, ' ') + 1;
+        const std::string pictures = folder.file("a." + extension), sound = folder.file("a.aac"),
+                          to = folder.file("out.mov"), same = folder.file("same.mov");
+        const Words coded = {"-i", file, "-an", "-c:v", encoder, "-bf", "2", "-g", "15"};
+        for (const std::string& output : {same, pictures}) {
+            Words words = coded;
+            words.push_back(output);
+            ASSERT_EQ(ffmpeg(words).status, 0);
+        }
+        ASSERT_EQ(ffmpeg({"-i", file, "-vn", "-c", "copy", sound}).status, 0);
+        QvFileMuxConfig config;
+        config.addStream(qvVideoStream, Any(pictures.c_str()), "h264venc").framerate =
+            QvFramerate(30000.0 / 1001);
+        auto& second = config.addStream(qvAudioStream, Any(sound.c_str()), "aacaenc");
+        second.samplerate = 48000;
+        second.channels = 1;
+        double last = 0;
+        config.watch = [&last](double part) { return part >= std::exchange(last, part); };
+        const std::unique_ptr<QvCodec> made(av::newMultiplexer("movmux")),
+            sinkCodec(qv_registry()->newCodec("filesink"));
+        auto& muxer = static_cast<QvMuxer&>(*made);
+        auto& sink = static_cast<QvSink&>(*sinkCodec);
+        muxer.init();
+        sink.setParam("filename", Any(to.c_str()));
+        muxer.attachOutStream(sink.stream());
+        ASSERT_EQ(sink.open(), 0);
+        ASSERT_EQ(muxer.muxElementaryStreams(config, *sink.stream()), 0) << muxer.errorDesc();
+        ASSERT_EQ(sink.close(), 0) << sink.errorDesc();
+        EXPECT_EQ(muxer.nrStreams(0), 0);
+        const UnitSender expected(same), result(to, &expected);
+        ASSERT_EQ(result.streams.size(), 2u);
+        EXPECT_EQ(times(result, 0), times(expected, 0));
+        EXPECT_TRUE(decoded(to, "v") == decoded(same, "v"));
+        EXPECT_EQ(result.streams[1].units, film->streams[1].units);
+        EXPECT_GE(last, 0.99);
     }
 }
 
