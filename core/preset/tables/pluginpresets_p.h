@@ -1,6 +1,6 @@
 // What plug-ins add to the catalogue of presets: the attribute "presets" of a plug-in, and the attribute
-// "compatMuxers" of its encoders, and the attribute "compatCodecs" of its multiplexers. They come from outside:
-// what is ill-formed is left out, with a line in the log.
+// "compatMuxers" of its encoders, and the attribute "compatCodecs" of its multiplexers. They come from
+// outside: what is ill-formed is left out, with a line in the log.
 #pragma once
 
 #include <string>
