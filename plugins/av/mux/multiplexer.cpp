@@ -290,7 +290,7 @@ int Multiplexer::check() {
     for (std::size_t i = 0; i < film_->tracks(); ++i)
         streams.push_back({film_->track(i).video(), film_->written(i)});
     const Any name = outStream()->getParam("outfilename");
-    const std::string problem = checkFilm(name, formFor(container_, extension()).format, streams);
+    const std::string problem = checkFilm(name, formFor(container_, extension()).container->format, streams);
     if (problem.empty()) return QvStatus::ok;
     return setError(QvStatus::failed, "%s was written, but can't be read again: %s", textOf(name).c_str(),
                     problem.c_str());

@@ -28,7 +28,8 @@ void placeByNumber(const std::vector<Coded>& all, std::vector<long long>& places
         std::iota(order.begin(), order.end(), first);
         std::stable_sort(order.begin(), order.end(),
                          [&all](std::size_t a, std::size_t b) { return all[a].number < all[b].number; });
-        for (std::size_t i = 0; i < order.size(); ++i) places[order[i]] = static_cast<long long>(first + i);
+        for (std::size_t i = 0; i < order.size(); ++i)
+            places[order[i]] = static_cast<long long>(first) + static_cast<long long>(i);
         first = end;
     }
 }

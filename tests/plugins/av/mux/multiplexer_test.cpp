@@ -193,6 +193,25 @@ TEST_F(EveryContainer, takesEachCodecOfItsRowAndNamesTheOthers) {
         }
 }
 
+TEST_F(EveryContainer, holdsOnePicture) {
+    const struct {
+        const char *module, *name;
+        int source;
+    } cases[] = {
+        {"mp4mux", "a.mp4", 0},    {"movmux", "b.mov", 11}, {"mkvmux", "c.mkv", 1},
+        {"webmmux", "d.webm", 4},  {"mxfmux", "e.mxf", 6},  {"mptsmux", "f.ts", 0},
+        {"mpegpsmux", "g.mpg", 6}, {"dvmux", "h.dv", 9},    {"dvavimux", "i.avi", 12},
+    };
+    for (const auto& c : cases) {
+        UnitSender film(make(kPictures[c.source], true));
+        film.units.resize(1);
+        const std::string to = folder.file(c.name);
+        EXPECT_EQ(mux(c.module, film, to), "") << c.name;
+        const std::string pictures = decoded(to, "v");
+        EXPECT_EQ(std::count(pictures.begin(), pictures.end(), '\n'), 1) << c.name;
+    }
+}
+
 // FLAC's length and digest are known at the end.
 TEST_F(EveryContainer, hasTheOwnDataOfACodecAsTheyBecame) {
     const std::string from = make(kSounds[5], false);
