@@ -10,14 +10,23 @@
 
 namespace av {
 
+namespace {
+
+AnyVector words(const char* text) {
+    AnyVector all;
+    std::istringstream stream(text);
+    for (std::string word; stream >> word;) all.append(Any(word.c_str()));
+    return all;
+}
+
+}  // namespace
+
 void addMultiplexers(QvPlugin& plugin, const std::shared_ptr<CodecLibrary>& library) {
     for (const MuxerModule& row : muxerModules) {
         QvModule* const module =
             newModule(library, QvModuleType::muxer, row.name, row.description, row.displayName);
-        AnyVector extensions;
-        std::istringstream words(row.extensions);
-        for (std::string word; words >> word;) extensions.append(Any(word.c_str()));
-        module->setAttr("exts", extensions);
+        module->setAttr("exts", words(row.extensions));
+        module->setAttr("compatEncoders", words(row.encoders));
         module->setAttr("sizedStreams", 1);
         if (row.transportStream) module->setAttr("transportStream", 1);
         plugin.addModule(module);

@@ -10,6 +10,7 @@ namespace {
 
 using enum MuxCodec;
 using namespace FilmWord;
+using namespace MuxTrait;
 
 // clang-format off
 constexpr auto codecRows = std::to_array<MuxCodecRow>({
@@ -42,37 +43,50 @@ static_assert(codecRows.size() == static_cast<std::size_t>(MuxCodec::count));
 
 constexpr std::uint32_t everySound = codecBits(aac, mp2, mp3, ac3, eac3, flac, opus, vorbis, pcm);
 constexpr std::uint32_t everything = (1u << static_cast<int>(MuxCodec::count)) - 1;
-constexpr std::uint32_t mp4Codecs = codecBits(h264, hevc, av1, vp9, mpeg1, mpeg2, mpeg4, mjpeg, jpeg2000, aac, mp2, mp3, ac3, eac3, flac, opus, vorbis);
+constexpr std::uint32_t mp4Codecs = codecBits(h264, hevc, av1, vp9, mpeg1, mpeg2, mpeg4, mjpeg, jpeg2000, aac, mp3, ac3, eac3, flac, opus, vorbis);
 constexpr std::uint32_t movCodecs = codecBits(h264, hevc, mpeg2, mpeg4, dnxhd, dv, jpeg2000, prores, mjpeg, raw, aac, mp3, ac3, eac3, pcm);
 
 // In the order of muxerModules.
 constexpr auto containers = std::to_array<Container>({
-    // format          codecs                                                   video sound pipe
-    //   words                                                   lengths adts   front  counted pixels bigPcm
-    {"mp4",          mp4Codecs,                                                  16, 32, PipeForm::fragments,
-         title | commonTags | chapters | timecode | language,    true,  false, true,  false,  true,  false},
-    {"mov",          movCodecs,                                                  16, 32, PipeForm::fragments,
-         title | commonTags | chapters | timecode | language,    true,  false, true,  false,  true,  false},
-    {"matroska",     everything,                                                 16, 64, PipeForm::live,
-         title | commonTags | allTags | chapters | timecode | language, true, false, false, false, false, false, true},
-    {"webm",         codecBits(vp8, vp9, av1, opus, vorbis),                     16, 32, PipeForm::live,
-         title | commonTags | allTags | chapters | language,     true,  false, false, false,  false, false, true},
-    {"mxf",          codecBits(mpeg1, mpeg2, h264, dnxhd, dv, jpeg2000, prores, ffv1, pcm), 1, 16, PipeForm::same,
-         title | timecode,                                       false, false, false, false,  true,  false},
-    {"mpegts",       codecBits(h264, hevc, mpeg1, mpeg2, mpeg4, jpeg2000, aac, mp2, mp3, ac3, eac3, opus), 8, 32, PipeForm::same,
-         title | language,                                       false, true,  false, false,  false, false},
-    {"mpeg",         codecBits(h264, mpeg1, mpeg2, mp2, mp3, ac3, pcm),          8, 16, PipeForm::same,
-         0,                                                      false, true,  false, false,  false, true},
-    {"dv",           codecBits(dv, pcm),                                         1, 4,  PipeForm::same,
-         timecode,                                               false, false, false, true,   false, false},
-    {"avi",          codecBits(dv, h264, mpeg1, mpeg2, mpeg4, mjpeg, ffv1, raw, mp2, mp3, ac3, pcm), 8, 32, PipeForm::none,
-         title | commonTags | language,                          false, true,  false, true,   false, false},
-    {"yuv4mpegpipe", codecBits(raw),                                             1, 0,  PipeForm::same,
-         0,                                                      false, false, false, true,   true,  false},
-    {"flac",         codecBits(flac),                                            0, 1,  PipeForm::same,
-         title | commonTags | allTags,                           false, false, false, true,   false, false},
-    {"ogg",          codecBits(flac, opus, vorbis, vp8),                         1, 8,  PipeForm::same,
-         title | commonTags | allTags | chapters,                false, false, false, false,  false, false},
+    // format        codecs                                                     video sound  pipe
+    //   words
+    //   traits
+    {"mp4",          mp4Codecs,                                                    16, 32, PipeForm::fragments,
+         title | commonTags | chapters | timecode | language,
+         lengths | indexInFront | pixels},
+    {"mov",          movCodecs,                                                    16, 32, PipeForm::fragments,
+         title | commonTags | chapters | timecode | language,
+         lengths | indexInFront | pixels},
+    {"matroska",     everything,                                                   16, 64, PipeForm::live,
+         title | commonTags | allTags | chapters | timecode | language,
+         lengths},
+    {"webm",         codecBits(vp8, vp9, av1, opus, vorbis),                       16, 32, PipeForm::live,
+         title | commonTags | allTags | chapters | language,
+         lengths},
+    {"mxf",          codecBits(mpeg2, h264, dnxhd, dv, jpeg2000, prores, pcm),      1, 16, PipeForm::same,
+         title | timecode,
+         pixels | needsVideo, codecBit(h264)},
+    {"mpegts",       codecBits(h264, hevc, mpeg1, mpeg2, mpeg4, aac, mp2, mp3, ac3, eac3, opus), 8, 32, PipeForm::same,
+         title | language,
+         adts},
+    {"vob",          codecBits(h264, mpeg1, mpeg2, mp2, mp3, ac3, pcm),             8, 16, PipeForm::same,
+         0,
+         adts | bigPcm, 0, nullptr, "mpeg"},
+    {"dv",           codecBits(dv, pcm),                                            1, 4,  PipeForm::same,
+         timecode,
+         counted | needsVideo | pixels, 0, "rawvideo"},
+    {"avi",          codecBits(dv, mpeg4, mjpeg, ffv1, raw, mp2, mp3, ac3, pcm),    8, 32, PipeForm::none,
+         title | commonTags | language,
+         adts | counted, codecBit(mpeg4)},
+    {"yuv4mpegpipe", codecBits(raw),                                                1, 0,  PipeForm::same,
+         0,
+         counted | needsVideo | wrapsPictures},
+    {"flac",         codecBits(flac),                                               0, 1,  PipeForm::same,
+         title | commonTags | allTags,
+         counted},
+    {"ogg",          codecBits(flac, opus, vorbis),                                 0, 8,  PipeForm::same,
+         title | commonTags | allTags | chapters,
+         0},
 });
 static_assert(containers.size() == muxerModules.size());
 
@@ -83,7 +97,6 @@ constexpr struct {
     {"mp4mux",    "mov", "movmux",    "mov"},
     {"mp4mux",    "m4a", "mp4mux",    "ipod"},
     {"mp4mux",    "3gp", "mp4mux",    "3gp"},
-    {"mpegpsmux", "vob", "mpegpsmux", "vob"},
 };
 // clang-format on
 
@@ -100,6 +113,16 @@ const MuxCodecRow* muxCodec(std::uint32_t fourcc) {
             if (names.substr(at, 4) == std::string_view(text, 4)) return &row;
     }
     return nullptr;
+}
+
+std::uint32_t muxFourcc(AVCodecID id) {
+    for (const MuxCodecRow& row : codecRows) {
+        if (row.id != id || std::strlen(row.fourccs) < 4) continue;
+        std::uint32_t fourcc = 0;
+        for (int i = 3; i >= 0; --i) fourcc = fourcc << 8 | static_cast<unsigned char>(row.fourccs[i]);
+        return fourcc;
+    }
+    return 0;
 }
 
 const MuxCodecRow& muxCodecRow(MuxCodec codec) { return codecRows[static_cast<std::size_t>(codec)]; }

@@ -49,6 +49,7 @@ struct MuxCodecRow {
 // Null for a FOURCC that no codec has.
 const MuxCodecRow* muxCodec(std::uint32_t fourcc);
 const MuxCodecRow& muxCodecRow(MuxCodec codec);
+std::uint32_t muxFourcc(AVCodecID id);  // for a head; 0 for what no codec is
 
 constexpr std::uint32_t codecBit(MuxCodec codec) { return 1u << static_cast<int>(codec); }
 template <class... C>
@@ -70,20 +71,31 @@ namespace FilmWord {
 enum : unsigned { title = 1, commonTags = 2, allTags = 4, chapters = 8, timecode = 16, language = 32 };
 }
 
+namespace MuxTrait {
+enum : unsigned {
+    lengths = 1,       // H.264 and H.265 with lengths, and their parameter sets in the header only
+    adts = 2,          // AAC keeps its ADTS headers
+    indexInFront = 4,  // room for its index can be kept before the pictures
+    counted = 8,       // streams start at 0 and have no times: sound before it is left out
+    pixels = 16,       // its header says what the pixels are
+    bigPcm = 32,       // PCM has the high byte first
+    needsVideo = 64,
+    wrapsPictures = 128  // raw ones go to the libraries as their frames
+};
+}
+
 struct Container {
     const char* format;    // the libraries' name of it
     std::uint32_t codecs;  // bits of codecBit
     int videos, sounds;    // streams at most
     PipeForm pipe;
-    unsigned words;            // bits of FilmWord
-    bool lengths;              // H.264 and H.265 with lengths, and their parameter sets in the header only
-    bool adts;                 // AAC keeps its ADTS headers
-    bool indexInFront;         // room for its index can be kept before the pictures
-    bool counted;              // streams start at 0 and have no times: sound before it is left out
-    bool pixels;               // its header says what the pixels are
-    bool bigPcm;               // PCM has the high byte first
-    bool statesDelay = false;  // of sound, in its header
+    unsigned words;                // bits of FilmWord
+    unsigned traits;               // bits of MuxTrait
+    std::uint32_t inOrder = 0;     // codecs whose pictures it only holds in the order in which they are shown
+    const char* silent = nullptr;  // the libraries' format of it without sound, where that is another
+    const char* mpeg1 = nullptr;   // the same for pictures and sound of MPEG-1 alone
 
+    bool is(unsigned trait) const { return (traits & trait) != 0; }
     const MuxerModule& module() const;
     bool takes(MuxCodec codec) const { return (codecs & codecBit(codec)) != 0; }
     // "H.264, H.265 and AAC", of one kind.

@@ -12,13 +12,19 @@ namespace {
 // Containers whose table of samples has every unit.
 bool countsUnits(const AVFormatContext& film) { return std::strstr(film.iformat->name, "mp4") != nullptr; }
 
+// A short film may be too little to be recognised. The readers of some containers have other names.
+std::string readerOf(const std::string& format) {
+    if (format == "mp4") return "mov";
+    if (format == "webm") return "matroska";
+    return format == "vob" ? "mpeg" : format;
+}
+
 }  // namespace
 
 std::string checkFilm(const Any& file, const char* format, const std::vector<FilmExpectation>& streams) {
     std::string reason;
     const MediaBytes bytes(file);
-    const bool sound = std::strcmp(format, "flac") == 0;
-    const auto film = MediaInput::open(bytes, sound ? format : "", reason);
+    const auto film = MediaInput::open(bytes, readerOf(format), reason);
     if (!film) return reason;
     const AVFormatContext& context = film->context();
     for (const bool video : {true, false}) {

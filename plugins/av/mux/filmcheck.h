@@ -13,8 +13,8 @@ struct FilmExpectation {
     long long units;  // written
 };
 
-// What is wrong with the file: it can't be opened, streams are missing, or its index has other counts. "" if
-// nothing is. Reads headers and indexes, not the units.
+// `format` is that of a Container. What is wrong with the file: it can't be opened, streams are missing, or
+// its index has other counts. "" if nothing is. Reads headers and indexes, not the units.
 std::string checkFilm(const Any& file, const char* format, const std::vector<FilmExpectation>& streams);
 
 }  // namespace av

@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <climits>
 #include <cstring>
+#include <functional>
+#include <string_view>
 #include <utility>
 
 #include "core/engine/log/qvlog.h"
@@ -14,6 +16,19 @@ namespace av {
 namespace {
 
 int openNothing(AVFormatContext*, AVIOContext**, const char*, int, AVDictionary**) { return AVERROR(EPERM); }
+
+// Two of the codes of ISO 639-2 stand for one language. QuickTime's list has the older ones.
+std::string languageFor(const char* format, const std::string& language) {
+    static constexpr std::pair<std::string_view, std::string_view> older[] = {
+        {"deu", "ger"}, {"nld", "dut"}, {"ces", "cze"}, {"zho", "chi"}, {"ell", "gre"}, {"fas", "per"},
+        {"ron", "rum"}, {"slk", "slo"}, {"sqi", "alb"}, {"hye", "arm"}, {"eus", "baq"}, {"mya", "bur"},
+        {"kat", "geo"}, {"isl", "ice"}, {"mkd", "mac"}, {"msa", "may"}, {"bod", "tib"}, {"cym", "wel"},
+    };
+    if (std::string_view(format) != "mov") return language;
+    for (const auto& [code, old] : older)
+        if (language == code) return std::string(old);
+    return language;
+}
 
 }  // namespace
 
@@ -28,7 +43,11 @@ FilmWriter::FilmWriter(QvBufStream& output, FilmJob job, std::vector<MuxTrack> t
 FilmWriter::~FilmWriter() = default;
 
 bool FilmWriter::fail(const std::string& problem) {
-    if (problem_.empty()) problem_ = problem.empty() ? "Multiplexing failed" : problem;
+    const std::lock_guard lock(lock_);
+    if (!failed_) {
+        problem_ = problem;
+        failed_ = true;
+    }
     return false;
 }
 
@@ -76,8 +95,18 @@ bool FilmWriter::beginIfReady() {
     return !ready || begin();
 }
 
+void FilmWriter::chooseFormat() {
+    const auto all = [this](auto is) { return std::all_of(tracks_.begin(), tracks_.end(), is); };
+    const auto old = [](const MuxTrack& track) {
+        return track.codec().codec == MuxCodec::mpeg1 || track.codec().codec == MuxCodec::mp2;
+    };
+    if (job_.container->silent && all(std::mem_fn(&MuxTrack::video))) job_.format = job_.container->silent;
+    if (job_.container->mpeg1 && all(old)) job_.format = job_.container->mpeg1;
+}
+
 bool FilmWriter::begin() {
     AVFormatContext* made = nullptr;
+    chooseFormat();
     int result = avformat_alloc_output_context2(&made, nullptr, job_.format, nullptr);
     film_.reset(made);
     if (result < 0) return failWith("the libraries do not have it", result);
@@ -85,9 +114,8 @@ bool FilmWriter::begin() {
     made->flags |= AVFMT_FLAG_CUSTOM_IO;
     made->flush_packets = 0;
     made->io_open = openNothing;
-    made->strict_std_compliance = FF_COMPLIANCE_UNOFFICIAL;
-    // Matroska shows from 0 on: what is before it is the priming that its header states.
-    if (job_.container->statesDelay) made->avoid_negative_ts = AVFMT_AVOID_NEG_TS_DISABLED;
+    // What the libraries call experimental is the usual form by now: FLAC in MP4, deep colour in Y4M.
+    made->strict_std_compliance = FF_COMPLIANCE_EXPERIMENTAL;
     for (MuxTrack& track : tracks_)
         if (!addStream(track)) return failWith("a stream could not be made", AVERROR(ENOMEM));
     const std::string lost = setFilmWords(*made, *job_.container, job_.meta, seconds());
@@ -119,7 +147,7 @@ bool FilmWriter::addStream(MuxTrack& track) {
                        })->place() == track.place();
     if (first) stream->disposition |= AV_DISPOSITION_DEFAULT;
     if (!track.language.empty() && (job_.container->words & FilmWord::language))
-        av_dict_set(&stream->metadata, "language", track.language.c_str(), 0);
+        av_dict_set(&stream->metadata, "language", languageFor(job_.format, track.language).c_str(), 0);
     if (!track.title.empty() && (job_.container->words & FilmWord::commonTags))
         av_dict_set(&stream->metadata, "title", track.title.c_str(), 0);
     return true;
@@ -150,7 +178,7 @@ long long FilmWriter::indexBytes() const {
 
 void FilmWriter::setOptions(AVDictionary** options) {
     const Container& container = *job_.container;
-    if (container.indexInFront) {
+    if (container.is(MuxTrait::indexInFront)) {
         const bool pipe = !job_.seekable;
         av_dict_set(options, "movflags",
                     pipe ? "+write_colr+frag_keyframe+delay_moov+default_base_moof" : "+write_colr", 0);
@@ -164,7 +192,13 @@ void FilmWriter::setOptions(AVDictionary** options) {
         if (av_dict_get(film_->metadata, "timecode", nullptr, 0)) av_dict_set(options, "write_tmcd", "1", 0);
     }
     if (!job_.seekable && container.pipe == PipeForm::live) av_dict_set(options, "live", "1", 0);
-    if (job_.extension == "m2ts" || job_.extension == "mts") av_dict_set(options, "mpegts_m2ts_mode", "1", 0);
+    // Packets with a time before each are those of disks, which have no other sound.
+    const bool disk = std::none_of(tracks_.begin(), tracks_.end(), [](const MuxTrack& track) {
+        return !track.video() && track.codec().codec != MuxCodec::ac3 &&
+               track.codec().codec != MuxCodec::eac3;
+    });
+    if (disk && (job_.extension == "m2ts" || job_.extension == "mts"))
+        av_dict_set(options, "mpegts_m2ts_mode", "1", 0);
     AVDictionary* own = nullptr;
     parseMuxOptions(job_.options, job_.format, &own);
     const AVDictionaryEntry* entry = nullptr;

@@ -1,6 +1,7 @@
 // A container being written: streams, header, units by time, trailer.
 #pragma once
 
+#include <atomic>
 #include <memory>
 #include <mutex>
 #include <optional>
@@ -47,7 +48,7 @@ class FilmWriter {
     std::size_t tracks() const { return tracks_.size(); }
     long long written(std::size_t track) const { return written_[track]; }  // units
     bool fail(const std::string& problem);
-    bool failed() const { return !problem_.empty(); }
+    bool failed() const { return failed_; }
     // Of the first failure; the sink's own reason if it is one of the output.
     const std::string& problem() const { return problem_; }
     bool outputFailed() const { return bytes_.failed(); }
@@ -71,9 +72,11 @@ class FilmWriter {
     std::vector<PacketPtr> made_;
     bool begun_ = false;
     bool spaceKept_ = false;
+    std::atomic<bool> failed_ = false;  // set after the problem, which does not change any more
     std::string problem_;
 
     bool beginIfReady();
+    void chooseFormat();
     bool begin();
     bool addStream(MuxTrack& track);
     void setOptions(AVDictionary** options);

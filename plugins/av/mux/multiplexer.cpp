@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <climits>
 #include <cstring>
+#include <functional>
 
 #include "core/arch/qvassert.h"
 #include "core/engine/files/qvfileutil.h"
@@ -12,6 +13,7 @@
 #include "core/engine/status.h"
 #include "core/measure/qvgeometry.h"
 #include "core/preset/qvpresetmgr.h"
+#include "plugins/av/mux/filefeed.h"
 #include "plugins/av/mux/filmcheck.h"
 #include "plugins/av/mux/filmwriter.h"
 #include "plugins/av/mux/muxoptions.h"
@@ -76,6 +78,8 @@ constexpr QvParamRow<Multiplexer> answerRows[] = {
      Answer{nullptr, [](const Multiplexer& m, Any& v) { v = codecs(m, QvModuleType::videoEncoder); }}},
     {"audioCodecs",
      Answer{nullptr, [](const Multiplexer& m, Any& v) { v = codecs(m, QvModuleType::audioEncoder); }}},
+    {"videoNecessary", Answer{nullptr, [](const Multiplexer& m,
+                                          Any& v) { v = m.container().is(MuxTrait::needsVideo) ? 1 : 0; }}},
     {"maxStreams", Answer{nullptr, [](const Multiplexer& m, Any& v) { v = limits(m); }}},
 };
 static_assert(qvParamTableOk<Multiplexer>(answerRows));
@@ -229,6 +233,9 @@ int Multiplexer::open() {
     for (const int type : {qvVideoStream, qvAudioStream})
         for (int nr = 0; nr < nrStreams(type); ++nr)
             if (const int result = describe(type, nr, *container, tracks)) return result;
+    const bool pictures = std::any_of(tracks.begin(), tracks.end(), std::mem_fn(&MuxTrack::video));
+    if (container->is(MuxTrait::needsVideo) && !pictures)
+        return setError(QvStatus::failed, "%s requires video stream", container->module().displayName);
     FilmJob job;
     job.container = container;
     job.format = format;
@@ -283,7 +290,7 @@ int Multiplexer::check() {
     for (std::size_t i = 0; i < film_->tracks(); ++i)
         streams.push_back({film_->track(i).video(), film_->written(i)});
     const Any name = outStream()->getParam("outfilename");
-    const std::string problem = checkFilm(name, formFor(container_, extension()).format, streams);
+    const std::string problem = checkFilm(name, formFor(container_, extension()).container->format, streams);
     if (problem.empty()) return QvStatus::ok;
     return setError(QvStatus::failed, "%s was written, but can't be read again: %s", textOf(name).c_str(),
                     problem.c_str());
@@ -302,7 +309,9 @@ void Multiplexer::end() {
 }
 
 int Multiplexer::muxElementaryStreams(QvFileMuxConfig& config, QvBufStream& output) {
-    return BaseMuxer::muxElementaryStreams(config, output);
+    std::string error;
+    const int result = muxFiles(*this, config, output, error);
+    return result < 0 ? setError(result, "%s", error.c_str()) : result;
 }
 
 QvCodec* newMultiplexer(const char* module) {

@@ -29,13 +29,17 @@ struct RawForm {
     unsigned fourcc;
     AVCodecID codec;
     AVPixelFormat pixels;
-    unsigned tag;  // of the library; 0: its own choice
+    unsigned tag;        // of the library; 0: its own choice
+    unsigned boxed = 0;  // tag in QuickTime
 };
 constexpr RawForm rawForms[] = {
     {QvFourcc::I420, AV_CODEC_ID_RAWVIDEO, AV_PIX_FMT_YUV420P, MKTAG('I', '4', '2', '0')},
-    {QvFourcc::YUYV, AV_CODEC_ID_RAWVIDEO, AV_PIX_FMT_YUYV422, 0},
-    {QvFourcc::YUY2, AV_CODEC_ID_RAWVIDEO, AV_PIX_FMT_YUYV422, 0},
-    {QvFourcc::UYVY, AV_CODEC_ID_RAWVIDEO, AV_PIX_FMT_UYVY422, 0},
+    {QvFourcc::YUYV, AV_CODEC_ID_RAWVIDEO, AV_PIX_FMT_YUYV422, MKTAG('Y', 'U', 'Y', '2'),
+     MKTAG('y', 'u', 'v', 's')},
+    {QvFourcc::YUY2, AV_CODEC_ID_RAWVIDEO, AV_PIX_FMT_YUYV422, MKTAG('Y', 'U', 'Y', '2'),
+     MKTAG('y', 'u', 'v', 's')},
+    {QvFourcc::UYVY, AV_CODEC_ID_RAWVIDEO, AV_PIX_FMT_UYVY422, MKTAG('U', 'Y', 'V', 'Y'),
+     MKTAG('2', 'v', 'u', 'y')},
     {QvFourcc::W016, AV_CODEC_ID_RAWVIDEO, AV_PIX_FMT_YUV420P16LE, 0},
     {QvFourcc::v210, AV_CODEC_ID_V210, AV_PIX_FMT_YUV422P10LE, 0},
 };
@@ -115,6 +119,9 @@ bool MuxTrack::describe(const QvWire::VideoHead& head) {
         return fail("there are no pictures of " + std::to_string(head.width) + "x" +
                     std::to_string(head.height));
     if (!choose(muxCodec(head.codec), head.codec)) return false;
+    if (head.delay > 0 && (container_->inOrder & codecBit(codec_->codec)) != 0)
+        return fail(std::string(container_->module().displayName) +
+                    " does not hold the order of B-frames of " + codec_->name + "; encode without them");
     AVCodecParameters& to = *parameters_;
     to.width = head.width;
     to.height = head.height;
@@ -139,12 +146,13 @@ bool MuxTrack::describe(const QvWire::VideoHead& head) {
                        head.extradataBytes > 0 && head.extradata &&
                        *static_cast<const std::uint8_t*>(head.extradata) == 1;
     if (!boxed && !setOwnData(head.extradata, head.extradataBytes)) return false;
-    awaitsUnit_ = (codec_->setsInBand && container_->lengths && to.extradata_size == 0) || container_->pixels;
+    awaitsUnit_ = (codec_->setsInBand && container_->is(MuxTrait::lengths) && to.extradata_size == 0) ||
+                  container_->is(MuxTrait::pixels);
     return makeFilter();
 }
 
 void MuxTrack::chooseTag(int profile) {
-    const bool boxes = container_->indexInFront;
+    const bool boxes = container_->is(MuxTrait::indexInFront);
     if (codec_->codec == MuxCodec::hevc && boxes)
         parameters_->codec_tag = MKTAG('h', 'v', 'c', '1');
     else if (codec_->codec == MuxCodec::prores && profile >= 0 &&
@@ -181,7 +189,7 @@ bool MuxTrack::describe(const QvWire::AudioHead& head) {
     to.profile = head.profile >= 0 ? head.profile : FF_PROFILE_UNKNOWN;
     if (codec_->codec == MuxCodec::pcm) choosePcm(head.bits);
     if (!setOwnData(head.extradata, head.extradataBytes)) return false;
-    awaitsUnit_ = codec_->setsInBand && container_->lengths && to.extradata_size == 0;
+    awaitsUnit_ = codec_->setsInBand && container_->is(MuxTrait::lengths) && to.extradata_size == 0;
     return makeFilter();
 }
 
@@ -192,7 +200,7 @@ void MuxTrack::choosePcm(int bits) {
                                    AV_CODEC_ID_PCM_S32LE};
     constexpr std::array big = {AV_CODEC_ID_PCM_U8, AV_CODEC_ID_PCM_S16BE, AV_CODEC_ID_PCM_S24BE,
                                 AV_CODEC_ID_PCM_S32BE};
-    to.codec_id = (container_->bigPcm ? big : little)[static_cast<std::size_t>(bytes - 1)];
+    to.codec_id = (container_->is(MuxTrait::bigPcm) ? big : little)[static_cast<std::size_t>(bytes - 1)];
     to.bits_per_coded_sample = bytes * 8;
     to.block_align = sampleBytes_ = bytes * to.ch_layout.nb_channels;
     to.bit_rate = std::int64_t{8} * to.block_align * to.sample_rate;
@@ -232,8 +240,9 @@ bool MuxTrack::describeRaw(const QvCodec& encoder) {
         return fail("there are no pictures of " + std::to_string(to.width) + "x" + std::to_string(to.height));
     pictureBytes_ = frame.total_bytes();
     codec_ = &muxCodecRow(MuxCodec::raw);
-    to.codec_id = form->codec;
-    to.codec_tag = form->tag;
+    to.codec_id = container_->is(MuxTrait::wrapsPictures) ? AV_CODEC_ID_WRAPPED_AVFRAME : form->codec;
+    const bool boxes = container_->is(MuxTrait::indexInFront);
+    to.codec_tag = container_->is(MuxTrait::wrapsPictures) ? 0 : boxes ? form->boxed : form->tag;
     to.format = form->pixels;
     rate_ = {static_cast<int>(ratio.num), static_cast<int>(ratio.den)};
     timeBase_ = {rate_.den, rate_.num};
@@ -249,9 +258,9 @@ bool MuxTrack::makeFilter() {
     const char* name = nullptr;
     const char* options = nullptr;
     const MuxCodec codec = codec_->codec;
-    if (container_->lengths && (codec == MuxCodec::h264 || codec == MuxCodec::hevc))
+    if (container_->is(MuxTrait::lengths) && (codec == MuxCodec::h264 || codec == MuxCodec::hevc))
         name = "extract_extradata", options = "1";
-    else if (codec == MuxCodec::aac && !container_->adts)
+    else if (codec == MuxCodec::aac && !container_->is(MuxTrait::adts))
         name = "aac_adtstoasc";
     else if (codec_->setsInBand && awaitsUnit_ && codec != MuxCodec::aac)
         name = "extract_extradata";
@@ -277,10 +286,11 @@ bool MuxTrack::learn(AVPacket& unit) {
         av_packet_free_side_data(&unit);
     }
     if (!awaitsUnit_) return true;
-    if (container_->pixels && video_ && parameters_->format < 0) probePixels(*parameters_, unit);
+    if (container_->is(MuxTrait::pixels) && video_ && parameters_->format < 0)
+        probePixels(*parameters_, unit);
     const bool needs =
         codec_->codec == MuxCodec::h264 || codec_->codec == MuxCodec::hevc || codec_->codec == MuxCodec::aac;
-    if (needs && container_->lengths && parameters_->extradata_size == 0)
+    if (needs && container_->is(MuxTrait::lengths) && parameters_->extradata_size == 0)
         return fail(std::string("the first unit of ") + codec_->name + " has no parameters of its own");
     awaitsUnit_ = false;
     return true;
@@ -288,16 +298,16 @@ bool MuxTrack::learn(AVPacket& unit) {
 
 bool MuxTrack::take(PacketPtr unit, std::vector<PacketPtr>& out) {
     if (unit->pts == AV_NOPTS_VALUE) unit->pts = unit->dts = next_;
-    if (unit->pts < -std::int64_t{parameters_->initial_padding} || unit->pts > 1LL << 48 ||
-        unit->duration < 0)
+    if ((!video_ && unit->pts < -std::int64_t{parameters_->initial_padding}) || unit->dts < -(1LL << 48) ||
+        unit->pts < -(1LL << 48) || unit->pts > 1LL << 48 || unit->duration < 0)
         return fail("a unit has the time " + std::to_string(unit->pts));
+    if (video_ && (unit->pts < unit->dts || (last_ != AV_NOPTS_VALUE && unit->dts <= last_)))
+        return fail("a unit is to be decoded at " + std::to_string(unit->dts) + ", out of order");
+    last_ = unit->dts;
     next_ = std::max(next_, unit->pts + unit->duration);
-    if (video_ || codec_->codec != MuxCodec::pcm || !container_->bigPcm) {
-    } else if (av_packet_make_writable(unit.get()) >= 0) {
-        const int bytes = sampleBytes_ / std::max(parameters_->ch_layout.nb_channels, 1);
-        for (int at = 0; at + bytes <= unit->size; at += bytes)
-            std::reverse(unit->data + at, unit->data + at + bytes);
-    }
+    if (parameters_->codec_id == AV_CODEC_ID_WRAPPED_AVFRAME && !wrap(*unit)) return false;
+    if (!video_ && codec_->codec == MuxCodec::pcm && container_->is(MuxTrait::bigPcm))
+        return takeBigPcm(*unit, out);
     if (!filter_) return learn(*unit) && pass(std::move(unit), out);
     int result = av_bsf_send_packet(filter_.get(), unit.get());
     while (result >= 0) {
@@ -310,6 +320,50 @@ bool MuxTrack::take(PacketPtr unit, std::vector<PacketPtr>& out) {
     return fail(std::string("a unit is no ") + codec_->name + ": " + errorText(result));
 }
 
+// The library's form of pictures that are not coded: the data of the unit is a frame.
+bool MuxTrack::wrap(AVPacket& unit) {
+    FramePtr frame(av_frame_alloc());
+    if (!frame) return fail("there is no memory for a picture");
+    frame->format = parameters_->format;
+    frame->width = parameters_->width;
+    frame->height = parameters_->height;
+    av_image_fill_arrays(frame->data, frame->linesize, unit.data, static_cast<AVPixelFormat>(frame->format),
+                         frame->width, frame->height, 1);
+    std::swap(frame->buf[0], unit.buf);
+    auto* const data = reinterpret_cast<std::uint8_t*>(frame.get());
+    const auto release = [](void*, std::uint8_t* wrapped) {
+        const FramePtr owner(reinterpret_cast<AVFrame*>(wrapped));
+    };
+    unit.data = nullptr;
+    unit.size = 0;
+    unit.buf = av_buffer_create(data, sizeof(AVFrame), release, nullptr, 0);
+    if (!unit.buf) return fail("there is no memory for a picture");
+    frame.release();
+    unit.data = data;
+    unit.size = sizeof(AVFrame);
+    return true;
+}
+
+// In pieces that fit into the buffer of a player of program streams, high bytes first.
+bool MuxTrack::takeBigPcm(AVPacket& unit, std::vector<PacketPtr>& out) {
+    constexpr int mostBytes = 1920;
+    const int width = sampleBytes_ / std::max(parameters_->ch_layout.nb_channels, 1);
+    const int step = std::max(mostBytes / sampleBytes_, 1) * sampleBytes_;
+    if (av_packet_make_writable(&unit) < 0) return fail("there is no memory for a unit");
+    for (int at = 0; at + width <= unit.size; at += width)
+        std::reverse(unit.data + at, unit.data + at + width);
+    for (int at = 0; at < unit.size; at += step) {
+        PacketPtr part(av_packet_clone(&unit));
+        if (!part) return fail("there is no memory for a unit");
+        part->data += at;
+        part->size = std::min(step, unit.size - at);
+        part->pts = part->dts = unit.pts + at / sampleBytes_;
+        part->duration = part->size / sampleBytes_;
+        if (!pass(std::move(part), out)) return false;
+    }
+    return true;
+}
+
 bool MuxTrack::pass(PacketPtr unit, std::vector<PacketPtr>& out) {
     if (!video_) return hold(std::move(unit), out);
     out.push_back(std::move(unit));
@@ -318,7 +372,7 @@ bool MuxTrack::pass(PacketPtr unit, std::vector<PacketPtr>& out) {
 
 // The last unit of sound may be heard in part only, which is known at the end.
 bool MuxTrack::hold(PacketPtr unit, std::vector<PacketPtr>& out) {
-    if (container_->counted && unit->pts + unit->duration <= 0) return true;
+    if (container_->is(MuxTrait::counted) && unit->pts + unit->duration <= 0) return true;
     if (held_) out.push_back(std::move(held_));
     held_ = std::move(unit);
     return true;

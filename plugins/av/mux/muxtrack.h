@@ -69,6 +69,7 @@ class MuxTrack {
     AVRational timeBase_{0, 1}, rate_{0, 1}, aspect_{0, 1};
     int sampleBytes_ = 0;
     std::int64_t pictureBytes_ = 0;
+    std::int64_t last_ = INT64_MIN;      // decoding time of the last unit
     std::int64_t next_ = 0;              // time of a unit that has none
     int trailing_ = 0;                   // samples that are not heard at the end
     PacketPtr held_;                     // the last unit of sound
@@ -81,6 +82,8 @@ class MuxTrack {
     void choosePcm(int bits);
     void chooseTag(int profile);
     bool learn(AVPacket& unit);
+    bool wrap(AVPacket& unit);
+    bool takeBigPcm(AVPacket& unit, std::vector<PacketPtr>& out);
     bool pass(PacketPtr unit, std::vector<PacketPtr>& out);
     bool hold(PacketPtr unit, std::vector<PacketPtr>& out);
     bool addOwnData(std::vector<PacketPtr>& out);

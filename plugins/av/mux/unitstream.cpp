@@ -78,7 +78,8 @@ class UnitStream::Record final : public Bufstream {
             default: return 0;
         }
         if (!ok) noteFailure();
-        return ok ? 0 : BUFSTREAM_FAILED;
+        // Encoders of raw data ask the stream for the reason only if it took the announcement.
+        return ok || raw_ ? 0 : BUFSTREAM_FAILED;
     }
     unsigned split() override { return BUFSTREAM_FAILED; }
     void done(int) override {}
