@@ -7,6 +7,7 @@
 #include <string>
 #include <vector>
 
+#include "plugins/av/index/packetsamples.h"
 #include "plugins/av/source/mediainput.h"
 
 namespace av {
@@ -17,11 +18,14 @@ struct IndexedPacket {
     std::uint32_t duration;                // in the time base; 0 where the container doesn't say
     std::uint32_t flags;                   // of the library (AV_PKT_FLAG_...), and `skipped`
     std::uint32_t skipAtStart, skipAtEnd;  // samples that the container says are priming or padding
+    std::uint32_t bytes = 0;
+    std::uint32_t samples =
+        unknownSamples;  // of sound: what it decodes to, if that is known without decoding
 
     bool key() const { return (flags & 1u) != 0; }
     PacketKey which() const { return {pts, dts, position}; }
 };
-static_assert(sizeof(IndexedPacket) <= 64, "aim: 64 bytes a packet");
+static_assert(sizeof(IndexedPacket) <= 48, "aim: 64 bytes a packet with what its reader adds");
 
 class PacketIndex {
   public:
