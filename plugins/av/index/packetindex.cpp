@@ -80,4 +80,13 @@ std::size_t PacketIndex::startFor(int stream, std::size_t wanted, std::size_t pr
     return start - std::min(start, preroll);
 }
 
+PacketKey PacketIndex::keyOf(int stream, std::size_t packet) const {
+    const auto& all = packets(stream);
+    const IndexedPacket& wanted = all[packet];
+    std::uint32_t ordinal = 0;
+    if (wanted.position < 0) return {wanted.pts, wanted.dts, wanted.position};
+    while (packet > ordinal && all[packet - ordinal - 1].position == wanted.position) ++ordinal;
+    return {wanted.pts, wanted.dts, wanted.position, ordinal};
+}
+
 }  // namespace av

@@ -23,7 +23,6 @@ struct IndexedPacket {
         unknownSamples;  // of sound: what it decodes to, if that is known without decoding
 
     bool key() const { return (flags & 1u) != 0; }
-    PacketKey which() const { return {pts, dts, position}; }
 };
 static_assert(sizeof(IndexedPacket) <= 48, "aim: 64 bytes a packet with what its reader adds");
 
@@ -41,6 +40,8 @@ class PacketIndex {
     // stream is decoded from its start: a key packet at or before it, with `preroll` packets before that for
     // codecs that need them.
     std::size_t startFor(int stream, std::size_t wanted, std::size_t preroll) const;
+
+    PacketKey keyOf(int stream, std::size_t packet) const;
 
     const std::string& damage() const { return damage_; }  // "" for none; else a part of a sentence
 

@@ -38,11 +38,11 @@ std::uint32_t ofOpus(Bytes data) {
     return data.size() < 2 ? 0 : (data[1] & 63u) * frame;
 }
 
-// A frame that is shorter than usual states its length.
-std::uint32_t ofAlac(Bytes data, int frame) {
-    constexpr std::size_t hasLength = 19, length = 23;
-    if (frame < 1) return unknownSamples;
-    return bits(data, hasLength, 1) ? bits(data, length, 32) : static_cast<std::uint32_t>(frame);
+// The codec's header has the usual length of a frame; one that is shorter states its own.
+std::uint32_t ofAlac(Bytes data, Bytes header) {
+    constexpr std::size_t usual = 12 * 8, hasLength = 19, length = 23;
+    if (header.size() < 36) return unknownSamples;
+    return bits(data, hasLength, 1) ? bits(data, length, 32) : bits(header, usual, 32);
 }
 
 // The core, in the byte order of discs; an extension of another rate shows when the first packets are
@@ -161,7 +161,8 @@ std::uint32_t PacketSamples::next(const AVPacket& packet) {
         case AV_CODEC_ID_OPUS: return ofOpus(data);
         case AV_CODEC_ID_VORBIS: return ofVorbis(data);
         case AV_CODEC_ID_FLAC: return ofFlac(data);
-        case AV_CODEC_ID_ALAC: return ofAlac(data, codec_->frame_size);
+        case AV_CODEC_ID_ALAC:
+            return ofAlac(data, {codec_->extradata, static_cast<std::size_t>(codec_->extradata_size)});
         case AV_CODEC_ID_DTS: return ofDts(data);
         default: break;
     }

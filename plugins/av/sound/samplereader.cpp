@@ -177,7 +177,7 @@ bool SampleReader::Decoding::seek(std::size_t packet) {
     within_ = 0;
     if (atStart) return true;
     const bool found =
-        packet == 0 ? input_->rewind() : input_->seekTo(stream_, packets()[packet].which(), packet);
+        packet == 0 ? input_->rewind() : input_->seekTo(stream_, index_->keyOf(stream_, packet), packet);
     if (!found) failure_ = input_->failure();
     return found;
 }

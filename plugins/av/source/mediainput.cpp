@@ -294,11 +294,19 @@ bool MediaInput::find(int stream, const PacketKey& key) {
     // Where pictures are cut out of a stream of bytes, the first one after a seek may be the end of another
     // with the time of this one.
     bool whole = !isCutByParser(context());
+    // Times of a page of Ogg are counted back from its end, which the end of the sound may have moved.
+    const bool pages = lower(context().iformat->name) == "ogg";
+    std::uint32_t before = 0;  // packets of the page
     AVPacket& packet = *state_->found;
     while (read(packet) == Read::packet) {
         if (packet.stream_index == stream) {
-            if (whole && same(key, packet, bare)) return state_->hasFound = true;
-            if (after(key, packet)) break;
+            if (pages) {
+                if (packet.pos > key.position) break;
+                if (packet.pos == key.position && before++ == key.ordinal) return state_->hasFound = true;
+            } else {
+                if (whole && same(key, packet, bare)) return state_->hasFound = true;
+                if (after(key, packet)) break;
+            }
             whole = true;
         }
         av_packet_unref(&packet);

@@ -37,8 +37,9 @@ class MediaBytes {
 
 // What tells packets of one stream apart; see PacketIndex.
 struct PacketKey {
-    std::int64_t pts, dts;  // in the stream's time base; AV_NOPTS_VALUE where the container has none
-    std::int64_t position;  // byte in the file; -1 where the container doesn't say
+    std::int64_t pts, dts;      // in the stream's time base; AV_NOPTS_VALUE where the container has none
+    std::int64_t position;      // byte in the file; -1 where the container doesn't say
+    std::uint32_t ordinal = 0;  // among the packets of its stream that have this position
 };
 
 class MediaInput {
