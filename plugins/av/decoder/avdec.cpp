@@ -208,6 +208,9 @@ void AvDec::addStreams(MediaInput& input, std::string& reason) {
             leaveOut(i, why);
             continue;
         }
+        if (const std::string& lost = reader->format().lost; !lost.empty())
+            qv_log()->warning("The sound of stream %u of '%s' is not all there: %s", i,
+                              filename().toString().asString(""), lost.c_str());
         auto* const added = addStream(std::make_unique<SoundStream>(std::move(reader), stream));
         if (isCut(i))
             added->setTruncated(announcedUnits(stream, container, added->reader().format().samplerate));

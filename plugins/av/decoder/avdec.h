@@ -20,11 +20,11 @@
 //     String    of the codec: "High", "Main 10" "language", "title" String    where the container has them
 //     "codecParams"       Dict      "pid", where the container numbers its streams
 //
-// A stream of sound has "codecProfile", "language", "title", "channelMask" (Int64), "concealed" (packets) and
-// "codecParams". AC-3 and E-AC-3 have the codec "Dolby", "codecProfile" says which, and "dolby" is the Dict
-// of the positions of "L", "R", "C", "Ls", "Rs" and "SUB" among the channels. The decoder's "meta" is the
-// Dict of what the film says of itself, see filmfacts.h. A file that is cut or damaged delivers what is
-// there, see "truncated" in the contract.
+// A stream of sound has "codecProfile", "language", "title", "channelMask" (Int64), "conversion" (why it ends
+// early), "concealed" (packets) and "codecParams". AC-3 and E-AC-3 have the codec "Dolby", "codecProfile"
+// says which, and "dolby" is the Dict of the positions of "L", "R", "C", "Ls", "Rs" and "SUB" among the
+// channels. The decoder's "meta" is the Dict of what the film says of itself, see filmfacts.h. A file that is
+// cut or damaged delivers what is there, see "truncated" in the contract.
 #pragma once
 
 #include <memory>

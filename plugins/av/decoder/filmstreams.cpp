@@ -85,6 +85,7 @@ SoundStream::SoundStream(std::unique_ptr<SampleReader> reader, const AVStream& s
     params.set("duration", static_cast<double>(format.samples) / format.samplerate);
     params.set("codec", Any(format.codec.c_str()));
     if (format.bitrate > 0) params.set("aBitrate", format.bitrate);
+    if (!format.lost.empty()) params.set("conversion", Any(format.lost.c_str()));
     if (format.mask != 0) params.set("channelMask", Any(static_cast<long long>(format.mask)));
     describeStream(stream, params);
     const AVCodecID codec = stream.codecpar->codec_id;

@@ -112,7 +112,7 @@ class SampleReader::Decoding {
     int samplerate_ = 0, channels_ = 0;
     AVSampleFormat kind_ = AV_SAMPLE_FMT_NONE;
     long long lost_ = 0;
-    std::string failure_;
+    std::string failure_, change_;
 
     const std::vector<IndexedPacket>& packets() const { return index_->packets(stream_); }
     AVStream& stream() { return *input_->context().streams[stream_]; }
@@ -148,7 +148,9 @@ bool SampleReader::Decoding::openCodec(std::string& reason) {
     const AVCodecParameters& parameters = *stream().codecpar;
     const AVCodec* const decoder = avcodec_find_decoder(parameters.codec_id);
     if (!decoder) {
-        reason = std::string("there is no decoder for ") + avcodec_get_name(parameters.codec_id);
+        reason = parameters.codec_id == AV_CODEC_ID_NONE
+                     ? std::string("the file does not say what it is")
+                     : std::string("there is no decoder for ") + avcodec_get_name(parameters.codec_id);
         return false;
     }
     codec_.reset(avcodec_alloc_context3(decoder));
@@ -252,7 +254,11 @@ bool SampleReader::Decoding::countByDecoding(std::string& reason) {
     Next result = seek(0) ? decode() : Next::failed;
     for (; result == Next::block; result = decode()) {
         take(*frame_);
-        if (!isSame()) break;
+        if (!isSame()) {
+            change_ = "it changes to " + std::to_string(frame_->sample_rate) + " Hz and " +
+                      std::to_string(frame_->ch_layout.nb_channels) + " channels, and ends there";
+            break;
+        }
         const auto packet = static_cast<std::size_t>(frame_->reordered_opaque);
         if (packet < counts_.size()) counts_[packet] += static_cast<std::uint32_t>(frame_->nb_samples);
     }
@@ -282,6 +288,7 @@ bool SampleReader::Decoding::describe(SoundFormat& format, std::string& reason) 
     if (frame_->ch_layout.order == AV_CHANNEL_ORDER_NATIVE) format.mask = frame_->ch_layout.u.mask;
     if (parameters.ch_layout.order == AV_CHANNEL_ORDER_NATIVE) format.mask = parameters.ch_layout.u.mask;
     format.codec = nameOf(parameters.codec_id);
+    format.lost = change_;
     format.bitrate = static_cast<int>(std::clamp<std::int64_t>(parameters.bit_rate / 1000, 0, 1'000'000));
     return true;
 }

@@ -112,6 +112,22 @@ TEST_F(SampleReaderOfFilms, samplesAreThoseOfAReadingFromTheStartWhereverReading
     }
 }
 
+TEST_F(SampleReaderOfFilms, endWhereTheirFormChanges) {
+    const std::string stereo = film("stereo.mp3", {"-ac", "2"}, "sine=duration=1"),
+                      mono = film("mono.mp3", {"-ac", "1", "-ar", "32000", "-write_xing", "0"},
+                                  "sine=duration=1");
+    folder.write("both.mp3", TempFolder::read(stereo) + TempFolder::read(mono));
+    const auto reader = open(folder.file("both.mp3"));
+    ASSERT_TRUE(reader);
+    EXPECT_EQ(reader->format().channels, 2);
+    EXPECT_NE(reader->format().lost.find("32000 Hz and 1 channels"), std::string::npos)
+        << reader->format().lost;
+    const auto bytes = static_cast<std::size_t>(reader->format().samples) * 6;
+    const std::string whole = read(*reader, 200000);
+    EXPECT_EQ(whole.size(), bytes);
+    EXPECT_NEAR(static_cast<double>(reader->format().samples), 44100, 1200);
+}
+
 // Priming and padding are cut: what went in comes out, as long as it was.
 TEST_F(SampleReaderOfFilms, haveTheLengthOfWhatWasEncoded) {
     for (const char* name : {"a.mp3", "a.opus", "a.ogg", "a.flac", "a.wav"}) {
