@@ -116,9 +116,10 @@ class SampleReader::Decoding {
 
     const std::vector<IndexedPacket>& packets() const { return index_->packets(stream_); }
     AVStream& stream() { return *input_->context().streams[stream_]; }
+    // Of MPEG audio the first frame of another rate still has the rate before.
+    int rate() const { return codec_->sample_rate > 0 ? codec_->sample_rate : frame_->sample_rate; }
     bool isSame() const {
-        return frame_->sample_rate == samplerate_ && frame_->ch_layout.nb_channels == channels_ &&
-               frame_->format == kind_;
+        return rate() == samplerate_ && frame_->ch_layout.nb_channels == channels_ && frame_->format == kind_;
     }
     bool openCodec(std::string& reason);
     bool seek(std::size_t packet);
@@ -216,7 +217,7 @@ SampleReader::Decoding::Next SampleReader::Decoding::decode() {
 // The first frame says what the sound is; a change of that later is the end of the stream.
 void SampleReader::Decoding::take(const AVFrame& frame) {
     if (samplerate_ != 0) return;
-    samplerate_ = frame.sample_rate;
+    samplerate_ = rate();
     channels_ = frame.ch_layout.nb_channels;
     kind_ = static_cast<AVSampleFormat>(frame.format);
 }
@@ -255,7 +256,7 @@ bool SampleReader::Decoding::countByDecoding(std::string& reason) {
     for (; result == Next::block; result = decode()) {
         take(*frame_);
         if (!isSame()) {
-            change_ = "it changes to " + std::to_string(frame_->sample_rate) + " Hz and " +
+            change_ = "it changes to " + std::to_string(rate()) + " Hz and " +
                       std::to_string(frame_->ch_layout.nb_channels) + " channels, and ends there";
             break;
         }
