@@ -2,6 +2,7 @@
 
 #include <array>
 #include <climits>
+#include <cstring>
 #include <utility>
 
 #include "plugins/av/source/avheaders.h"
@@ -268,7 +269,8 @@ MediaInput::Read MediaInput::read(AVPacket& packet) {
 bool MediaInput::rewind() {
     state_->hasFound = false;
     av_packet_unref(state_->found.get());
-    if (std::exchange(lost_, false)) {
+    // The library's reader of WavPack keeps the head of a block over a seek.
+    if (std::exchange(lost_, false) || std::strcmp(context().iformat->name, "wv") == 0) {
         const int streams = static_cast<int>(context().nb_streams);
         if (!openState(failure_)) return false;
         if (static_cast<int>(context().nb_streams) < streams) {
