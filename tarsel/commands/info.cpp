@@ -69,6 +69,18 @@ Json describeStream(const QvDecodePipe& decoder, int type, int number) {
         integer("channelMask", "channel_mask");
         integer("samples", "samples");
     }
+    const auto words = [&](const char* key, const char* name) {
+        if (p.get(key).isText()) stream[name] = validUtf8(text(p.get(key)));
+    };
+    words("codecProfile", "profile");
+    words("language", "language");
+    words("title", "title");
+    words("conversion", "conversion");
+    integer("rotation", "rotation");
+    integer("mirrored", "mirrored");
+    if (p.get("vBitrate").isDouble() && p.get("vBitrate").asDouble() > 0)
+        stream["bit_rate"] = static_cast<long long>(p.get("vBitrate").asDouble());
+    if (p.get("aBitrate").isInt()) stream["bit_rate"] = p.get("aBitrate").toInt64() * 1000;
     if (p.get("duration").isDouble()) stream["duration_s"] = p.get("duration").asDouble();
     return stream;
 }
@@ -101,6 +113,24 @@ void describeWords(const QvDecodePipe& decoder, Json& file) {
     for (const Any& id : others.asVector()) file["other_chunks"].push_back(id.asString(""));
 }
 
+// What a film says of itself.
+void describeFilm(const QvDecodePipe& decoder, Json& file) {
+    const Any meta = static_cast<const QvCodec&>(decoder).getParam("meta");
+    if (!meta.isDict()) return;
+    for (const auto [key, value] : meta.asDict())
+        if (value->isText() && std::string(key) != "startTimecode")
+            file["meta"][key] = validUtf8(text(*value));
+    const Any& chapters = meta.asDict().get("chapters");
+    if (!chapters.isVector()) return;
+    for (const Any& chapter : chapters.asVector()) {
+        if (!chapter.isDict() || !chapter.asDict().get("time").isMediaTime()) continue;
+        Json entry = {{"time_s", chapter.asDict().get("time").asMediaTime().seconds()}};
+        if (chapter.asDict().get("title").isText())
+            entry["title"] = validUtf8(text(chapter.asDict().get("title")));
+        file["chapters"].push_back(entry);
+    }
+}
+
 Json describe(const Source& source) {
     Json file = Json::object();
     file["file"] = validUtf8(source.name());
@@ -117,15 +147,28 @@ Json describe(const Source& source) {
     const Any meta = source.decoder().QvCodec::getParam("meta");
     if (meta.isDict() && !meta.asDict().empty()) file["meta"] = plainJson(meta.asDict());
     describeWords(source.decoder(), file);
+    describeFilm(source.decoder(), file);
     return file;
+}
+
+// A text of the file on one line, for a terminal.
+std::string oneLine(const Json& value) {
+    std::string line = value.is_string() ? value.get<std::string>() : value.dump();
+    for (char& c : line)
+        if (static_cast<unsigned char>(c) < ' ' || c == 0x7F) c = ' ';
+    // Control characters of two bytes, U+0080 to U+009F.
+    for (size_t i = 0; i + 1 < line.size(); ++i)
+        if (line[i] == '\xC2' && static_cast<unsigned char>(line[i + 1]) < 0xA0) line.replace(i, 2, "  ");
+    return line;
 }
 
 std::string streamLine(const Json& s) {
     const auto number = [&](const char* key) { return std::to_string(s[key].get<long long>()); };
     std::string line = s.value("codec", "");
     const auto add = [&](const std::string& part) { line += (line.empty() ? "" : ", ") + part; };
+    if (s.contains("profile")) line += (line.empty() ? "" : " ") + oneLine(s["profile"]);
     if (s["type"] == "video") {
-        if (s["pixel"] != line) add(s["pixel"].get<std::string>());
+        if (s["pixel"] != s.value("codec", "")) add(s["pixel"].get<std::string>());
         if (s.contains("width") && s.contains("height")) add(number("width") + "x" + number("height"));
         if (s.contains("rate"))
             add(s["rate_text"].get<std::string>() + " fps, " + s["scan"].get<std::string>());
@@ -153,18 +196,11 @@ std::string streamLine(const Json& s) {
         }
         if (s.contains("samples")) add(number("samples") + " samples");
     }
+    if (s.contains("bit_rate")) add(std::to_string(s["bit_rate"].get<long long>() / 1000) + " kbit/s");
+    if (s.contains("rotation")) add("turned by " + number("rotation") + " degrees");
+    if (s.contains("mirrored")) add("mirrored");
+    if (s.contains("language")) add(oneLine(s["language"]));
     if (s.contains("duration_s")) add(formatTime(s["duration_s"].get<double>()));
-    return line;
-}
-
-// A text of the file on one line, for a terminal.
-std::string oneLine(const Json& value) {
-    std::string line = value.is_string() ? value.get<std::string>() : value.dump();
-    for (char& c : line)
-        if (static_cast<unsigned char>(c) < ' ' || c == 0x7F) c = ' ';
-    // Control characters of two bytes, U+0080 to U+009F.
-    for (size_t i = 0; i + 1 < line.size(); ++i)
-        if (line[i] == '\xC2' && static_cast<unsigned char>(line[i + 1]) < 0xA0) line.replace(i, 2, "  ");
     return line;
 }
 
@@ -201,6 +237,12 @@ void printWords(const Json& file) {
         for (const Json& cue : file["cues"])
             printWord("cue", "sample " + part(cue, "position") +
                                  (cue.contains("label") ? ", " + part(cue, "label") : ""));
+    if (file.contains("meta"))
+        for (const auto& [key, value] : file["meta"].items()) printWord(key.c_str(), oneLine(value));
+    if (file.contains("chapters"))
+        for (const Json& chapter : file["chapters"])
+            printWord("chapter", formatTime(chapter["time_s"].get<double>()) +
+                                     (chapter.contains("title") ? ", " + part(chapter, "title") : ""));
     if (file.contains("other_chunks")) {
         std::string line;
         for (const Json& id : file["other_chunks"]) line += (line.empty() ? "" : ", ") + oneLine(id);

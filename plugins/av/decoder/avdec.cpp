@@ -10,6 +10,7 @@
 #include "core/engine/status.h"
 #include "core/measure/qvgeometry.h"
 #include "core/stream/qvbytesource.h"
+#include "plugins/av/decoder/filmfacts.h"
 #include "plugins/av/decoder/filmstreams.h"
 #include "plugins/av/index/packetindex.h"
 #include "plugins/av/source/avheaders.h"
@@ -96,12 +97,6 @@ bool endsEarly(const AVFormatContext& container, const PacketIndex& index) {
 
 }  // namespace
 
-// Where the film begins, in seconds: sound goes by it.
-struct FilmZero {
-    bool known = false;
-    std::int64_t time = 0, base = 1;
-};
-
 AvDec::~AvDec() { AvDec::close(); }
 
 // Parameters in a dictionary, as an application opens or restores with. The first failure counts.
@@ -122,6 +117,8 @@ int AvDec::setParam(const char* name, const Any& value) {
 void AvDec::getParam(const char* name, Any& value) const {
     if (std::strcmp(name, "filesize") == 0) {
         value = fileSize_;
+    } else if (std::strcmp(name, "meta") == 0) {
+        value = facts_;
     } else if (std::strcmp(name, "store") == 0) {
         AnyDict settings;
         qvStoreParamRows<Settings>(rows, settings_, settings);
@@ -211,15 +208,20 @@ void AvDec::addStreams(MediaInput& input, std::string& reason) {
             leaveOut(i, why);
             continue;
         }
+        if (const std::string& lost = reader->format().lost; !lost.empty())
+            qv_log()->warning("The sound of stream %u of '%s' is not all there: %s", i,
+                              filename().toString().asString(""), lost.c_str());
         auto* const added = addStream(std::make_unique<SoundStream>(std::move(reader), stream));
         if (isCut(i))
             added->setTruncated(announcedUnits(stream, container, added->reader().format().samplerate));
     }
     if (streams().empty()) addPictures(true);
+    facts_ = filmFacts(container, zero);
 }
 
 int AvDec::close() {
     const int result = BaseDecodePipe::close();
+    facts_ = {};
     index_.reset();
     bytes_.reset();
     return result;

@@ -14,13 +14,17 @@
 //     "mirrored"          Int32     1: it is to be shown mirrored
 //     "colourMatrix"      Int32     QvYUVMatrix, where the film states one of these
 //     "variableRate"      Int32     1: "framerate" is the nearest usual rate, and frames repeat or skip
-//     pictures "conversion"        String    what the pixel format can't hold, or how the frames are made of
-//     the pictures "language", "title" String    where the container has them "concealed"         Int64
-//     pictures so far that were damaged or did not come "codecParams"       Dict      "pid", where the
-//     container numbers its streams
+//                                   pictures
+//     "conversion"        String    what the pixel format can't hold, or how the frames are made of the
+//     pictures "concealed"         Int64     pictures so far that were damaged or did not come "codecProfile"
+//     String    of the codec: "High", "Main 10" "language", "title" String    where the container has them
+//     "codecParams"       Dict      "pid", where the container numbers its streams
 //
-// A stream of sound has "language", "title", "channelMask" (Int64), "concealed" (packets) and "codecParams".
-// A file that is cut or damaged delivers what is there, see "truncated" in the contract.
+// A stream of sound has "codecProfile", "language", "title", "channelMask" (Int64), "conversion" (why it ends
+// early), "concealed" (packets) and "codecParams". AC-3 and E-AC-3 have the codec "Dolby", "codecProfile"
+// says which, and "dolby" is the Dict of the positions of "L", "R", "C", "Ls", "Rs" and "SUB" among the
+// channels. The decoder's "meta" is the Dict of what the film says of itself, see filmfacts.h. A file that is
+// cut or damaged delivers what is there, see "truncated" in the contract.
 #pragma once
 
 #include <memory>
@@ -34,7 +38,6 @@ class QvByteSource;
 namespace av {
 
 class PacketIndex;
-struct FilmZero;
 
 class AvDec : public BaseDecodePipe {
   public:
@@ -63,6 +66,7 @@ class AvDec : public BaseDecodePipe {
     Settings settings_;
     std::unique_ptr<MediaBytes> bytes_;
     std::shared_ptr<const PacketIndex> index_;
+    AnyDict facts_;
     long long fileSize_ = -1;
 
     int setAll(const Any& value);

@@ -5,6 +5,7 @@
 
 #include "core/engine/status.h"
 #include "core/media/qvframe.h"
+#include "plugins/av/decoder/filmfacts.h"
 #include "plugins/av/source/avheaders.h"
 
 namespace av {
@@ -19,7 +20,12 @@ void setText(const AVDictionary* tags, const char* tag, const char* key, AnyDict
 }  // namespace
 
 void describeStream(const AVStream& stream, AnyDict& params) {
-    setText(stream.metadata, "language", "language", params);
+    const AVDictionaryEntry* const language = av_dict_get(stream.metadata, "language", nullptr, 0);
+    if (language && std::string(language->value) != "und")
+        setText(stream.metadata, "language", "language", params);
+    const AVCodecParameters& codec = *stream.codecpar;
+    if (const char* profile = avcodec_profile_name(codec.codec_id, codec.profile))
+        params.set("codecProfile", Any(profile));
     setText(stream.metadata, "title", "title", params);
     if (stream.id > 0) params.set("codecParams", AnyDict("pid", stream.id));
 }
@@ -79,8 +85,16 @@ SoundStream::SoundStream(std::unique_ptr<SampleReader> reader, const AVStream& s
     params.set("duration", static_cast<double>(format.samples) / format.samplerate);
     params.set("codec", Any(format.codec.c_str()));
     if (format.bitrate > 0) params.set("aBitrate", format.bitrate);
+    if (!format.lost.empty()) params.set("conversion", Any(format.lost.c_str()));
     if (format.mask != 0) params.set("channelMask", Any(static_cast<long long>(format.mask)));
     describeStream(stream, params);
+    const AVCodecID codec = stream.codecpar->codec_id;
+    if (codec == AV_CODEC_ID_AC3 || codec == AV_CODEC_ID_EAC3) {
+        // What the engine connects channels and encoders by.
+        params.set("codec", "Dolby");
+        params.set("codecProfile", Any(format.codec.c_str()));
+        params.set("dolby", Any(speakerPlaces(*stream.codecpar)));
+    }
     pcm = std::make_unique<QvPcm>();
     pcm->init(0, format.channels, bytes, format.samplerate);
 }

@@ -7,6 +7,7 @@
 #include <string>
 #include <vector>
 
+#include "plugins/av/index/packetsamples.h"
 #include "plugins/av/source/mediainput.h"
 
 namespace av {
@@ -17,11 +18,13 @@ struct IndexedPacket {
     std::uint32_t duration;                // in the time base; 0 where the container doesn't say
     std::uint32_t flags;                   // of the library (AV_PKT_FLAG_...), and `skipped`
     std::uint32_t skipAtStart, skipAtEnd;  // samples that the container says are priming or padding
+    std::uint32_t bytes = 0;
+    std::uint32_t samples =
+        unknownSamples;  // of sound: what it decodes to, if that is known without decoding
 
     bool key() const { return (flags & 1u) != 0; }
-    PacketKey which() const { return {pts, dts, position}; }
 };
-static_assert(sizeof(IndexedPacket) <= 64, "aim: 64 bytes a packet");
+static_assert(sizeof(IndexedPacket) <= 48, "aim: 64 bytes a packet with what its reader adds");
 
 class PacketIndex {
   public:
@@ -37,6 +40,8 @@ class PacketIndex {
     // stream is decoded from its start: a key packet at or before it, with `preroll` packets before that for
     // codecs that need them.
     std::size_t startFor(int stream, std::size_t wanted, std::size_t preroll) const;
+
+    PacketKey keyOf(int stream, std::size_t packet) const;
 
     const std::string& damage() const { return damage_; }  // "" for none; else a part of a sentence
 

@@ -67,7 +67,7 @@ bool DecodedPictures::seek(std::size_t packet) {
     position_ = packet;
     if (atStart) return true;
     const bool found =
-        packet == 0 ? input_->rewind() : input_->seekTo(stream_, packets()[packet].which(), packet);
+        packet == 0 ? input_->rewind() : input_->seekTo(stream_, index_->keyOf(stream_, packet), packet);
     if (!found) failure_ = input_->failure();
     return found;
 }

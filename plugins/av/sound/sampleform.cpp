@@ -37,8 +37,8 @@ Sample at(const AVFrame& from, int channels, int sample, int channel) {
 }
 
 template <class Sample>
-void copy(const AVFrame& from, int channels, unsigned char* to) {
-    for (int i = 0; i < from.nb_samples; ++i)
+void copy(const AVFrame& from, int channels, int first, int count, unsigned char* to) {
+    for (int i = first; i < first + count; ++i)
         for (int c = 0; c < channels; ++c, to += sizeof(Sample)) {
             const Sample value = at<Sample>(from, channels, i, c);
             std::memcpy(to, &value, sizeof value);
@@ -46,8 +46,8 @@ void copy(const AVFrame& from, int channels, unsigned char* to) {
 }
 
 template <class Sample>
-void narrow(const AVFrame& from, int channels, unsigned char* to) {
-    for (int i = 0; i < from.nb_samples; ++i)
+void narrow(const AVFrame& from, int channels, int first, int count, unsigned char* to) {
+    for (int i = first; i < first + count; ++i)
         for (int c = 0; c < channels; ++c, to += 3) {
             const auto value = static_cast<std::uint32_t>(as24(at<Sample>(from, channels, i, c)));
             to[0] = static_cast<unsigned char>(value);
@@ -70,18 +70,18 @@ int bitsOf(AVSampleFormat format) {
     }
 }
 
-void interleave(const AVFrame& from, std::vector<unsigned char>& to) {
+void interleave(const AVFrame& from, int first, int count, std::vector<unsigned char>& to) {
     const auto format = static_cast<AVSampleFormat>(from.format);
     const int channels = from.ch_layout.nb_channels;
-    to.resize(static_cast<std::size_t>(from.nb_samples) * static_cast<std::size_t>(channels) *
+    to.resize(static_cast<std::size_t>(count) * static_cast<std::size_t>(channels) *
               static_cast<std::size_t>(bitsOf(format) / 8));
     switch (av_get_packed_sample_fmt(format)) {
-        case AV_SAMPLE_FMT_U8: copy<std::uint8_t>(from, channels, to.data()); break;
-        case AV_SAMPLE_FMT_S16: copy<std::int16_t>(from, channels, to.data()); break;
-        case AV_SAMPLE_FMT_S32: narrow<std::int32_t>(from, channels, to.data()); break;
-        case AV_SAMPLE_FMT_S64: narrow<std::int64_t>(from, channels, to.data()); break;
-        case AV_SAMPLE_FMT_FLT: narrow<float>(from, channels, to.data()); break;
-        case AV_SAMPLE_FMT_DBL: narrow<double>(from, channels, to.data()); break;
+        case AV_SAMPLE_FMT_U8: copy<std::uint8_t>(from, channels, first, count, to.data()); break;
+        case AV_SAMPLE_FMT_S16: copy<std::int16_t>(from, channels, first, count, to.data()); break;
+        case AV_SAMPLE_FMT_S32: narrow<std::int32_t>(from, channels, first, count, to.data()); break;
+        case AV_SAMPLE_FMT_S64: narrow<std::int64_t>(from, channels, first, count, to.data()); break;
+        case AV_SAMPLE_FMT_FLT: narrow<float>(from, channels, first, count, to.data()); break;
+        case AV_SAMPLE_FMT_DBL: narrow<double>(from, channels, first, count, to.data()); break;
         default: break;
     }
 }

@@ -7,6 +7,7 @@
 
 #include "core/media/qvbuffer.h"
 #include "plugins/av/sound/sampleform.h"
+#include "plugins/av/sound/sampleplaces.h"
 #include "plugins/av/source/avheaders.h"
 #include "plugins/av/source/limits.h"
 
@@ -14,13 +15,44 @@ namespace av {
 
 namespace {
 
-// Packets before the wanted one that are decoded, so that what a codec carries from packet to packet is
-// there: the bit reservoir of MP3 reaches furthest.
-constexpr std::size_t preroll = 12;
+// What a codec carries from packet to packet, and so how far ahead of a packet decoding has to start.
+enum class Memory {
+    none,   // a key packet is enough
+    fades,  // overlaps, filters, the bit reservoir of MP3 (511 bytes back), the levels of Opus
+    stays,  // generators of noise and dither: only decoding from the start gives the same
+};
+constexpr std::size_t prerollPackets = 12;
+constexpr std::size_t prerollBytes = 1024;
+constexpr std::size_t prerollSamples = 9600;
+constexpr std::size_t opusPrerollSamples = 48000;
 
-bool standsAlone(AVCodecID codec) {
+Memory memoryOf(AVCodecID codec) {
     const AVCodecDescriptor* const row = avcodec_descriptor_get(codec);
-    return row && (row->props & AV_CODEC_PROP_LOSSLESS) && !(row->props & AV_CODEC_PROP_LOSSY);
+    if (row && (row->props & AV_CODEC_PROP_LOSSLESS) && !(row->props & AV_CODEC_PROP_LOSSY))
+        return Memory::none;
+    switch (codec) {
+        case AV_CODEC_ID_ADPCM_IMA_WAV:
+        case AV_CODEC_ID_ADPCM_MS: return Memory::none;
+        case AV_CODEC_ID_MP3:
+        case AV_CODEC_ID_VORBIS:
+        case AV_CODEC_ID_OPUS:
+        case AV_CODEC_ID_DTS: return Memory::fades;
+        default:
+            return codec >= AV_CODEC_ID_FIRST_AUDIO && codec < AV_CODEC_ID_ADPCM_IMA_QT ? Memory::none
+                                                                                        : Memory::stays;
+    }
+}
+
+constexpr std::size_t nothing = static_cast<std::size_t>(-1);
+
+// How many packets are decoded at the start to see that the codec gives what the packets say.
+constexpr std::size_t probedPackets = 16;
+
+// Samples at the start that the header of Opus says are none of the sound.
+std::uint32_t ownPriming(const AVCodecParameters& codec) {
+    constexpr int at = 10;
+    if (codec.codec_id != AV_CODEC_ID_OPUS || codec.extradata_size < at + 2) return 0;
+    return codec.extradata[at] | static_cast<std::uint32_t>(codec.extradata[at + 1]) << 8;
 }
 
 // As people, and the engine's logic, know them.
@@ -44,13 +76,13 @@ std::string nameOf(AVCodecID codec) {
 
 }  // namespace
 
-// Where each packet's samples lie is found out once, by decoding: only the codec knows how many there are.
+// How many samples each packet has, the packets say where they can; else all of them are decoded once.
 class SampleReader::Decoding {
   public:
     bool open(const MediaBytes& bytes, const std::string& format, int stream,
               std::shared_ptr<const PacketIndex> index, std::string& reason);
     bool describe(SoundFormat& format, std::string& reason);
-    // Samples of the whole stream.
+    // Samples of the whole stream, after describe().
     bool place(bool hasZero, std::int64_t zero, std::int64_t zeroBase, SoundFormat& format,
                std::string& reason);
     bool start(long long sample);  // decoding delivers this sample next, or later ones
@@ -67,30 +99,39 @@ class SampleReader::Decoding {
     CodecPtr codec_;
     PacketPtr packet_;
     FramePtr frame_;
-    bool waiting_ = false, draining_ = false, started_ = false;
-    std::size_t position_ = 0;           // packet that is read next
-    std::size_t from_ = 0;               // packets before it are decoded, and not delivered
-    std::vector<std::uint32_t> counts_;  // of a packet: samples
-    std::vector<long long> starts_;      // of a packet: place of the first of them
-    std::size_t current_ = 0;            // packet of the frame before
-    long long within_ = 0;               // samples of it that were delivered
+    bool waiting_ = false, draining_ = false;
+    bool started_ = false, used_ = false;  // the file was read; the codec was given packets
+    std::size_t position_ = 0;             // packet that is read next
+    std::size_t from_ = 0;                 // packets before it are decoded, and not delivered
+    std::vector<std::uint32_t> counts_;    // of a packet: samples, until they are placed
+    bool told_ = false;  // by the packets: priming and padding are cut here, not by the codec
+    unsigned primingScale_ = 1;
+    SamplePlaces places_;
+    std::size_t current_ = nothing;  // packet of the frame before
+    long long within_ = 0;           // samples of it that were decoded
     int samplerate_ = 0, channels_ = 0;
     AVSampleFormat kind_ = AV_SAMPLE_FMT_NONE;
     long long lost_ = 0;
-    std::string failure_;
+    std::string failure_, change_;
 
     const std::vector<IndexedPacket>& packets() const { return index_->packets(stream_); }
     AVStream& stream() { return *input_->context().streams[stream_]; }
+    // Of MPEG audio the first frame of another rate still has the rate before.
+    int rate() const { return codec_->sample_rate > 0 ? codec_->sample_rate : frame_->sample_rate; }
     bool isSame() const {
-        return frame_->sample_rate == samplerate_ && frame_->ch_layout.nb_channels == channels_ &&
-               frame_->format == kind_;
+        return rate() == samplerate_ && frame_->ch_layout.nb_channels == channels_ && frame_->format == kind_;
     }
+    bool openCodec(std::string& reason);
     bool seek(std::size_t packet);
     Next decode();
     Next outOfMemory() {
         failure_ = "out of memory";
         return Next::failed;
     }
+    bool decodesAsTold();
+    bool countByDecoding(std::string& reason);
+    void take(const AVFrame& frame);
+    std::size_t startFor(std::size_t packet) const;
 };
 
 bool SampleReader::Decoding::open(const MediaBytes& bytes, const std::string& format, int stream,
@@ -100,21 +141,31 @@ bool SampleReader::Decoding::open(const MediaBytes& bytes, const std::string& fo
     stream_ = stream;
     index_ = std::move(index);
     input_->selectOnly(stream);
-    const AVCodecParameters& parameters = *this->stream().codecpar;
+    packet_.reset(av_packet_alloc());
+    frame_.reset(av_frame_alloc());
+    if (packet_ && frame_) return openCodec(reason);
+    reason = "out of memory";
+    return false;
+}
+
+// A new one for each start: flushing leaves some of the memory of what was decoded before.
+bool SampleReader::Decoding::openCodec(std::string& reason) {
+    const AVCodecParameters& parameters = *stream().codecpar;
     const AVCodec* const decoder = avcodec_find_decoder(parameters.codec_id);
     if (!decoder) {
-        reason = std::string("there is no decoder for ") + avcodec_get_name(parameters.codec_id);
+        reason = parameters.codec_id == AV_CODEC_ID_NONE
+                     ? std::string("the file does not say what it is")
+                     : std::string("there is no decoder for ") + avcodec_get_name(parameters.codec_id);
         return false;
     }
     codec_.reset(avcodec_alloc_context3(decoder));
-    packet_.reset(av_packet_alloc());
-    frame_.reset(av_frame_alloc());
-    if (!codec_ || !packet_ || !frame_ || avcodec_parameters_to_context(codec_.get(), &parameters) < 0) {
+    if (!codec_ || avcodec_parameters_to_context(codec_.get(), &parameters) < 0) {
         reason = "out of memory";
         return false;
     }
-    codec_->pkt_timebase = this->stream().time_base;
+    codec_->pkt_timebase = stream().time_base;
     codec_->thread_count = 1;
+    if (told_) codec_->flags2 |= AV_CODEC_FLAG2_SKIP_MANUAL;
     if (const int result = avcodec_open2(codec_.get(), decoder, nullptr); result < 0) {
         reason = std::string("its ") + avcodec_get_name(parameters.codec_id) + " can't be decoded (" +
                  errorText(result) + ")";
@@ -127,13 +178,13 @@ bool SampleReader::Decoding::seek(std::size_t packet) {
     const bool atStart = packet == 0 && !started_;
     waiting_ = draining_ = false;
     av_packet_unref(packet_.get());
-    avcodec_flush_buffers(codec_.get());
+    if (std::exchange(used_, false) && !openCodec(failure_)) return false;
     position_ = packet;
     current_ = packet;
     within_ = 0;
     if (atStart) return true;
     const bool found =
-        packet == 0 ? input_->rewind() : input_->seekTo(stream_, packets()[packet].which(), packet);
+        packet == 0 ? input_->rewind() : input_->seekTo(stream_, index_->keyOf(stream_, packet), packet);
     if (!found) failure_ = input_->failure();
     return found;
 }
@@ -146,7 +197,7 @@ SampleReader::Decoding::Next SampleReader::Decoding::decode() {
         if (result == AVERROR_EOF || (draining_ && result == AVERROR(EAGAIN))) return Next::end;
         if (result == AVERROR(ENOMEM)) return outOfMemory();
         if (draining_) continue;
-        started_ = true;
+        started_ = used_ = true;
         if (!waiting_) {
             const MediaInput::Read read = input_->read(*packet_);
             if (read == MediaInput::Read::failed && position_ < packets().size()) {
@@ -169,31 +220,69 @@ SampleReader::Decoding::Next SampleReader::Decoding::decode() {
     }
 }
 
+// The first frame says what the sound is; a change of that later is the end of the stream.
+void SampleReader::Decoding::take(const AVFrame& frame) {
+    if (samplerate_ != 0) return;
+    samplerate_ = rate();
+    channels_ = frame.ch_layout.nb_channels;
+    kind_ = static_cast<AVSampleFormat>(frame.format);
+}
+
+// Whether all packets say how many samples they have, and the codec makes as many of the first of them.
+bool SampleReader::Decoding::decodesAsTold() {
+    const auto& all = packets();
+    if (std::any_of(all.begin(), all.end(),
+                    [](const IndexedPacket& packet) { return packet.samples == unknownSamples; }))
+        return false;
+    codec_->flags2 |= AV_CODEC_FLAG2_SKIP_MANUAL;
+    std::vector<std::uint64_t> decoded(std::min(all.size(), probedPackets), 0);
+    while (decode() == Next::block) {
+        take(*frame_);
+        const auto packet = static_cast<std::size_t>(frame_->reordered_opaque);
+        if (!isSame() || packet >= decoded.size()) break;
+        decoded[packet] += static_cast<std::uint64_t>(frame_->nb_samples);
+    }
+    // AAC states half of its rate where bands of high frequencies are added to it.
+    const bool doubles =
+        stream().codecpar->codec_id == AV_CODEC_ID_AAC || stream().codecpar->codec_id == AV_CODEC_ID_AAC_LATM;
+    const std::uint64_t told = all[0].samples;
+    primingScale_ = doubles && decoded[0] == 2 * told ? 2 : 1;
+    for (std::size_t i = 0; i < decoded.size(); ++i)
+        if (decoded[i] != std::uint64_t{all[i].samples} * primingScale_) return false;
+    counts_.clear();
+    counts_.reserve(all.size());
+    for (const IndexedPacket& packet : all) counts_.push_back(packet.samples * primingScale_);
+    return samplerate_ != 0;
+}
+
+bool SampleReader::Decoding::countByDecoding(std::string& reason) {
+    samplerate_ = 0;
+    counts_.assign(packets().size(), 0);
+    Next result = seek(0) ? decode() : Next::failed;
+    for (; result == Next::block; result = decode()) {
+        take(*frame_);
+        if (!isSame()) {
+            change_ = "it changes to " + std::to_string(rate()) + " Hz and " +
+                      std::to_string(frame_->ch_layout.nb_channels) + " channels, and ends there";
+            break;
+        }
+        const auto packet = static_cast<std::size_t>(frame_->reordered_opaque);
+        if (packet < counts_.size()) counts_[packet] += static_cast<std::uint32_t>(frame_->nb_samples);
+    }
+    if (result == Next::failed) reason = failure_;
+    return result != Next::failed;
+}
+
 bool SampleReader::Decoding::describe(SoundFormat& format, std::string& reason) {
     if (packets().empty()) {
         reason = "its stream of sound is empty";
         return false;
     }
-    counts_.assign(packets().size(), 0);
-    const AVCodecParameters& parameters = *stream().codecpar;
-    // The first frame says what it is; a change of that later is the end of the stream.
-    for (;;) {
-        const Next next = decode();
-        if (next == Next::failed) {
-            reason = failure_;
-            return false;
-        }
-        if (next == Next::end) break;
-        if (samplerate_ == 0) {
-            samplerate_ = frame_->sample_rate;
-            channels_ = frame_->ch_layout.nb_channels;
-            kind_ = static_cast<AVSampleFormat>(frame_->format);
-        }
-        if (!isSame()) break;
-        const auto packet = static_cast<std::size_t>(frame_->reordered_opaque);
-        if (packet < counts_.size()) counts_[packet] += static_cast<std::uint32_t>(frame_->nb_samples);
-    }
+    told_ = decodesAsTold();
+    if (!told_ && !countByDecoding(reason)) return false;
     lost_ = 0;
+    current_ = nothing;
+    const AVCodecParameters& parameters = *stream().codecpar;
     format.samplerate = samplerate_;
     format.channels = channels_;
     format.bits = bitsOf(kind_);
@@ -206,62 +295,51 @@ bool SampleReader::Decoding::describe(SoundFormat& format, std::string& reason) 
     if (frame_->ch_layout.order == AV_CHANNEL_ORDER_NATIVE) format.mask = frame_->ch_layout.u.mask;
     if (parameters.ch_layout.order == AV_CHANNEL_ORDER_NATIVE) format.mask = parameters.ch_layout.u.mask;
     format.codec = nameOf(parameters.codec_id);
+    format.lost = change_;
     format.bitrate = static_cast<int>(std::clamp<std::int64_t>(parameters.bit_rate / 1000, 0, 1'000'000));
     return true;
 }
 
 bool SampleReader::Decoding::place(bool hasZero, std::int64_t zero, std::int64_t zeroBase,
                                    SoundFormat& format, std::string& reason) {
-    const AVRational base = stream().time_base, sample{1, samplerate_};
-    const long long unit = av_rescale_q_rnd(1, base, sample, AV_ROUND_UP);
-    const long long tolerance = std::max<long long>(samplerate_ / 20, 2 * unit);
-    const long long origin = hasZero ? av_rescale(zero, samplerate_, std::max<std::int64_t>(zeroBase, 1)) : 0;
-    starts_.assign(counts_.size(), 0);
-    long long due = 0, shift = 0, end = 0;
-    bool first = true;
-    for (std::size_t i = 0; i < counts_.size(); ++i) {
-        if (counts_[i] == 0) {
-            starts_[i] = due;
-            continue;
-        }
-        const IndexedPacket& packet = packets()[i];
-        long long at = due;
-        if (packet.pts != AV_NOPTS_VALUE) {
-            at = av_rescale_q(std::clamp<std::int64_t>(packet.pts, -(1LL << 60), 1LL << 60), base, sample) +
-                 packet.skipAtStart - origin;
-            if (first && !hasZero) shift = -at;
-            at += shift;
-        }
-        if (!first && std::llabs(at - due) <= tolerance) at = due;
-        // A jump of the clock is none of the film's silence.
-        if (!first && std::llabs(at - due) > 30LL * 60 * 60 * samplerate_) {
-            shift += due - at;
-            at = due;
-        }
-        starts_[i] = at;
-        due = std::max(due, at + counts_[i]);
-        if (first) due = at + counts_[i];
-        end = std::max(end, due);
-        first = false;
-    }
-    format.samples = std::max<long long>(end, 0);
+    const AVRational base = stream().time_base;
+    const std::int64_t origin =
+        hasZero ? av_rescale(zero, samplerate_, std::max<std::int64_t>(zeroBase, 1)) : 0;
+    places_.set(packets(), counts_, {told_, primingScale_, ownPriming(*stream().codecpar)},
+                {base.num, base.den, samplerate_, hasZero, origin});
+    counts_ = {};
+    format.samples = places_.samples();
     if (format.samples == 0) reason = "none of its sound belongs to the film";
     return format.samples > 0;
 }
 
-bool SampleReader::Decoding::start(long long sample) {
-    std::size_t packet = counts_.size();
-    for (std::size_t low = 0, high = counts_.size(); low < high;) {
-        const std::size_t middle = low + (high - low) / 2;
-        if (starts_[middle] + counts_[middle] > sample)
-            packet = high = middle;
-        else
-            low = middle + 1;
+// The packet from which decoding starts, so that this one comes out as from the start.
+std::size_t SampleReader::Decoding::startFor(std::size_t packet) const {
+    const auto& all = packets();
+    const AVCodecID codec = codec_->codec_id;
+    switch (memoryOf(codec)) {
+        case Memory::stays: return 0;
+        case Memory::none:
+            while (packet > 0 && !all[packet].key()) --packet;
+            return packet;
+        case Memory::fades: break;
     }
-    from_ = packet;
-    if (packet >= counts_.size()) packet = counts_.size() - 1;
-    const std::size_t before = standsAlone(codec_->codec_id) ? 0 : preroll;
-    return seek(packet - std::min(packet, before));
+    const std::size_t enough = codec == AV_CODEC_ID_OPUS ? opusPrerollSamples : prerollSamples;
+    std::size_t before = 0, bytes = 0, samples = 0;
+    while (packet > 0 && (before < prerollPackets || bytes < prerollBytes || samples < enough)) {
+        --packet;
+        ++before;
+        bytes += all[packet].bytes;
+        samples += places_.of(packet).front + places_.of(packet).kept;
+    }
+    return packet;
+}
+
+bool SampleReader::Decoding::start(long long sample) {
+    from_ = places_.packetAt(sample);
+    const std::size_t first = startFor(std::min(from_, places_.packets() - 1));
+    if (used_ && !draining_ && from_ > current_ && first <= position_) return true;
+    return seek(first);
 }
 
 SampleReader::Decoding::Next SampleReader::Decoding::next(long long& at, std::vector<unsigned char>& block) {
@@ -270,11 +348,16 @@ SampleReader::Decoding::Next SampleReader::Decoding::next(long long& at, std::ve
         if (result != Next::block) return result;
         if (!isSame()) return Next::end;
         const auto packet = static_cast<std::size_t>(frame_->reordered_opaque);
-        if (packet >= counts_.size() || packet < from_) continue;
+        if (packet >= places_.packets() || packet < from_) continue;
         if (std::exchange(current_, packet) != packet) within_ = 0;
-        at = starts_[packet] + within_;
-        within_ += frame_->nb_samples;
-        interleave(*frame_, block);
+        const SamplePlaces::Place& place = places_.of(packet);
+        const long long first = std::max<long long>(within_, place.front),
+                        end = std::min<long long>(within_ + frame_->nb_samples,
+                                                  static_cast<long long>(place.front) + place.kept);
+        const long long skipped = first - std::exchange(within_, within_ + frame_->nb_samples);
+        if (first >= end) continue;
+        at = place.start + first - place.front;
+        interleave(*frame_, static_cast<int>(skipped), static_cast<int>(end - first), block);
         return Next::block;
     }
 }
@@ -298,7 +381,10 @@ std::unique_ptr<SampleReader> SampleReader::open(const MediaBytes& bytes, const 
 
 bool SampleReader::seek(long long sample) {
     if (sample < 0 || sample > format_.samples) return false;
-    if (sample != next_) moved_ = true;
+    const auto size = static_cast<std::size_t>(format_.channels) * static_cast<std::size_t>(format_.bits / 8);
+    const bool isThere =
+        sample >= blockAt_ && sample < blockAt_ + static_cast<long long>(block_.size() / size);
+    if (sample != next_ && !isThere) moved_ = true;
     next_ = sample;
     return true;
 }

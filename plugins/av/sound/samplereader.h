@@ -25,6 +25,7 @@ struct SoundFormat {
     long long samples = 0;   // exact
     std::string codec;       // as people know it: "AAC", "PCM", "MP3"
     int bitrate = 0;         // kilobits a second; 0: unknown
+    std::string lost;        // why the sound ends before the stream does; "": it does not
 };
 
 class SampleReader {

@@ -10,6 +10,7 @@
 #pragma GCC diagnostic ignored "-Wsign-conversion"
 extern "C" {
 #include <libavcodec/avcodec.h>
+#include <libavcodec/vorbis_parser.h>
 #include <libavformat/avformat.h>
 #include <libavutil/avutil.h>
 #include <libavutil/display.h>

@@ -2,6 +2,7 @@
 
 #include <array>
 #include <climits>
+#include <cstring>
 #include <utility>
 
 #include "plugins/av/source/avheaders.h"
@@ -202,7 +203,7 @@ int MediaInput::State::open(const MediaBytes& bytes, const std::string& format) 
     return result;
 }
 
-MediaInput::MediaInput() : state_(std::make_unique<State>()) {}
+MediaInput::MediaInput() = default;
 MediaInput::~MediaInput() = default;
 
 AVFormatContext& MediaInput::context() { return *state_->context; }
@@ -211,18 +212,25 @@ const AVFormatContext& MediaInput::context() const { return *state_->context; }
 std::unique_ptr<MediaInput> MediaInput::open(const MediaBytes& bytes, const std::string& format,
                                              std::string& reason) {
     std::unique_ptr<MediaInput> input(new MediaInput);
-    State& state = *input->state_;
-    state.source = bytes.open(reason);
-    if (!state.source) return nullptr;
-    const int result = state.open(bytes, format);
+    input->bytes_ = &bytes;
+    input->format_ = format;
+    if (!input->openState(reason)) return nullptr;
+    return input;
+}
+
+bool MediaInput::openState(std::string& reason) {
+    state_ = std::make_unique<State>();
+    State& state = *state_;
+    state.source = bytes_->open(reason);
+    if (!state.source) return false;
+    const int result = state.open(*bytes_, format_);
     if (result < 0) {
         const std::string problem = state.source->failed() ? state.source->problem() : "";
         reason = problem.empty() ? reasonOf(result) : problem;
-        return nullptr;
+        return false;
     }
     reason = unfit(*state.context);
-    if (!reason.empty()) return nullptr;
-    return input;
+    return reason.empty();
 }
 
 void MediaInput::selectOnly(int stream) {
@@ -253,6 +261,7 @@ MediaInput::Read MediaInput::read(AVPacket& packet) {
         const bool noMemory = result == AVERROR(ENOMEM);
         if (!noMemory && (result == AVERROR_EOF || state_->io->eof_reached)) return Read::end;
         if (result == AVERROR(EAGAIN) && ++failures < 100) continue;
+        lost_ = true;
         failure_ = reasonOf(result);
         return Read::failed;
     }
@@ -261,6 +270,17 @@ MediaInput::Read MediaInput::read(AVPacket& packet) {
 bool MediaInput::rewind() {
     state_->hasFound = false;
     av_packet_unref(state_->found.get());
+    // The library's reader of WavPack keeps the head of a block over a seek.
+    if (std::exchange(lost_, false) || std::strcmp(context().iformat->name, "wv") == 0) {
+        const int streams = static_cast<int>(context().nb_streams);
+        if (!openState(failure_)) return false;
+        if (static_cast<int>(context().nb_streams) < streams) {
+            failure_ = "its streams have changed";
+            return false;
+        }
+        selectOnly(only_);
+        return true;
+    }
     AVFormatContext& all = context();
     if (isBare(all)) return av_seek_frame(&all, -1, 0, AVSEEK_FLAG_BYTE) >= 0;
     // The start of a film is not always a time of 0, and may be no key packet of any stream.
@@ -277,11 +297,19 @@ bool MediaInput::find(int stream, const PacketKey& key) {
     // Where pictures are cut out of a stream of bytes, the first one after a seek may be the end of another
     // with the time of this one.
     bool whole = !isCutByParser(context());
+    // Times of a page of Ogg are counted back from its end, which the end of the sound may have moved.
+    const bool pages = lower(context().iformat->name) == "ogg";
+    std::uint32_t before = 0;  // packets of the page
     AVPacket& packet = *state_->found;
     while (read(packet) == Read::packet) {
         if (packet.stream_index == stream) {
-            if (whole && same(key, packet, bare)) return state_->hasFound = true;
-            if (after(key, packet)) break;
+            if (pages) {
+                if (packet.pos > key.position) break;
+                if (packet.pos == key.position && before++ == key.ordinal) return state_->hasFound = true;
+            } else {
+                if (whole && same(key, packet, bare)) return state_->hasFound = true;
+                if (after(key, packet)) break;
+            }
             whole = true;
         }
         av_packet_unref(&packet);
@@ -302,6 +330,7 @@ bool MediaInput::count(int stream, std::size_t number) {
 }
 
 bool MediaInput::seekTo(int stream, const PacketKey& key, std::size_t number) {
+    if (lost_ && !rewind()) return false;
     AVFormatContext& all = context();
     state_->hasFound = false;
     av_packet_unref(state_->found.get());

@@ -37,8 +37,9 @@ class MediaBytes {
 
 // What tells packets of one stream apart; see PacketIndex.
 struct PacketKey {
-    std::int64_t pts, dts;  // in the stream's time base; AV_NOPTS_VALUE where the container has none
-    std::int64_t position;  // byte in the file; -1 where the container doesn't say
+    std::int64_t pts, dts;      // in the stream's time base; AV_NOPTS_VALUE where the container has none
+    std::int64_t position;      // byte in the file; -1 where the container doesn't say
+    std::uint32_t ordinal = 0;  // among the packets of its stream that have this position
 };
 
 class MediaInput {
@@ -70,15 +71,20 @@ class MediaInput {
     // some containers derive them from where reading began.
     // `number` is that of the packet among those of its stream.
     bool seekTo(int stream, const PacketKey& packet, std::size_t number);
+    // After a failed read the file is opened again: references into context() end.
     bool rewind();
 
   private:
     struct State;
     std::unique_ptr<State> state_;
+    const MediaBytes* bytes_ = nullptr;
+    std::string format_;
     int only_ = -1;
+    bool lost_ = false;  // a read failed: the demultiplexer may not find back from there
     std::string failure_;
 
     MediaInput();
+    bool openState(std::string& reason);
     bool find(int stream, const PacketKey& packet);
     bool count(int stream, std::size_t number);
 };

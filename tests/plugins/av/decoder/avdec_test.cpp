@@ -103,6 +103,55 @@ TEST_F(FilmsInTheTool, bringTheirSound) {
     EXPECT_TRUE(samples(folder.file("part.wav")) == samples(file).substr(2 * 20 * 1764, 2 * 10 * 1764));
 }
 
+TEST_F(FilmsInTheTool, sayOfThemselvesWhatTheyCarry) {
+    folder.write(
+        "facts.txt",
+        ";FFMETADATA1\ntitle=A day at sea\nartist=Jules\n[CHAPTER]\nTIMEBASE=1/1000\nSTART=0\nEND=800\n"
+        "title=Out\n[CHAPTER]\nTIMEBASE=1/1000\nSTART=800\nEND=2000\ntitle=Home\n");
+    // In Matroska the sound's priming delays the first picture, where the film begins.
+    const struct {
+        const char* name;
+        const char* second;
+    } cases[] = {{"film.mov", "0:00:00.800, Home"}, {"film.mkv", "0:00:00.794, Home"}};
+    for (const auto& [name, second] : cases) {
+        SCOPED_TRACE(name);
+        ASSERT_EQ(ffmpeg({"-f",
+                          "lavfi",
+                          "-i",
+                          kMoving,
+                          "-f",
+                          "lavfi",
+                          "-i",
+                          "aevalsrc=0|0|0|0|0|0:c=5.1:d=2",
+                          "-i",
+                          folder.file("facts.txt"),
+                          "-map_metadata",
+                          "2",
+                          "-c:v",
+                          "mpeg2video",
+                          "-c:a",
+                          "ac3",
+                          "-b:a",
+                          "448k",
+                          "-timecode",
+                          "10:20:30:05",
+                          "-metadata:s:a",
+                          "language=eng",
+                          folder.file(name)})
+                      .status,
+                  0);
+        const Outcome shown = tarsel({"info", name});
+        EXPECT_EQ(shown.status, 0) << shown.err;
+        for (const char* part :
+             {"MPEG-2 Main", "Dolby AC-3", "448 kbit/s, eng", "10:20:30:05", "A day at sea", "Jules", second})
+            EXPECT_THAT(shown.out, HasSubstr(part));
+        const Outcome json = tarsel({"info", "--json", name});
+        for (const char* part : {R"("timecode": "10:20:30:05")", R"("time_s": 0.)", R"("title": "Home")",
+                                 R"("language": "eng")", R"("profile": "AC-3")", R"("bit_rate": 448000)"})
+            EXPECT_THAT(json.out, HasSubstr(part));
+    }
+}
+
 TEST_F(FilmsInTheTool, keepTheirFieldsAndAspect) {
     film("fields.mpg",
          {"-c:v", "mpeg2video", "-flags", "+ildct+ilme", "-top", "1", "-vf", "setfield=tff,setdar=4/3"});
