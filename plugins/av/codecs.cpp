@@ -3,12 +3,13 @@
 
 #include "core/arch/api.h"
 #include "plugins/av/decoder/avdec.h"
+#include "plugins/av/encode/encoders.h"
 #include "plugins/av/source/librarylog.h"
 
 extern "C" QV_API QvCodec* av_create_codec(const char* module) {
     av::sendLibraryLog();
     if (std::strcmp(module, "avdec") == 0) return new av::AvDec;
-    return nullptr;
+    return av::newEncoder(module);
 }
 
 extern "C" QV_API void av_leave() { av::resetLibraryLog(); }

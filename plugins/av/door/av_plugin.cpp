@@ -15,6 +15,7 @@ extern "C" QV_API QvPlugin* plugin_init() {
     if (plugin.nrModules() == 0) {
         const auto library = std::make_shared<av::CodecLibrary>();
         av::addDecoders(plugin, library);
+        av::addEncoders(plugin, library);
     }
     plugin.setAttr("version", "1.0");
     plugin.setAttr("versionDate", "2026-11-22");

@@ -17,5 +17,6 @@ QvModule* newModule(const std::shared_ptr<CodecLibrary>& library, int type, cons
                     const char* description, const char* displayName);
 
 void addDecoders(QvPlugin& plugin, const std::shared_ptr<CodecLibrary>& library);
+void addEncoders(QvPlugin& plugin, const std::shared_ptr<CodecLibrary>& library);  // and the presets
 
 }  // namespace av
