@@ -6,9 +6,9 @@ namespace {
 
 // clang-format off
 constexpr PresetExtension kExtensions[] = {
-    {"mp4",  "mp4mux",    {"H264_HIGH", "MPEG4_HD", "MPEG2_MAIN"}},
+    {"mp4",  "mp4mux",    {"H.264 for the web", "H264_HIGH", "MPEG4_HD"}},
     {"m4v",  "mp4mux",    {"H264_HIGH", "MPEG4_HD"}},
-    {"mov",  "mp4mux",    {"H264_QT"}},
+    {"mov",  "movmux",    {"H.264 in QuickTime", "H264_QT"}, "mp4mux"},
     {"f4v",  "mp4mux",    {"FLASH_HIGH"}},
     {"3gp",  "mp4mux",    {"3GP_H264", "3GP_MPEG4", "3GP_H263"}},
     {"ts",   "mptsmux",   {"H264_HIGH", "MPEG2_MAIN"}},
@@ -24,7 +24,15 @@ constexpr PresetExtension kExtensions[] = {
     {"wmv",  "asfmux",    {"VC1_MAIN", "SILVERLIGHT_VC1"}},
     {"asf",  "asfmux",    {"VC1_MAIN", "SILVERLIGHT_VC1"}},
     {"divx", "dmfmux",    {"DIVX6_HDTV"}},
-    {"mkv",  "mkvmux",    {"DIVX7_HD_PLUS"}},
+    {"mkv",  "mkvmux",    {"H.264 in Matroska", "DIVX7_HD_PLUS"}},
+    {"webm", "webmmux",   {"AV1"}},
+    {"mp3",  "rawmux",    {"MP3"}},
+    {"m4a",  "mp4mux",    {"AAC"}},
+    {"aac",  "rawmux",    {"AAC"}},
+    {"flac", "flacmux",   {"FLAC"}},
+    {"opus", "oggmux",    {"Opus"}},
+    {"265",  "rawmux",    {"H.265"}},
+    {"hevc", "rawmux",    {"H.265"}},
     {"h264", "rawmux",    {"H264_HIGH"}},
     {"264",  "rawmux",    {"H264_HIGH"}},
     {"m2v",  "rawmux",    {"MPEG2_MAIN"}},

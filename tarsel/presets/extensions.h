@@ -8,7 +8,7 @@ struct PresetExtension {
     static constexpr int most = 3;
     std::string_view extension;  // without the dot, in small letters
     const char* muxer;
-    const char* symbols[most];  // of the presets, the first one that is installed is taken; null for none
+    const char* symbols[most];  // of the presets, or names of those of plug-ins: the first installed one; null for none
     const char* otherMuxer = nullptr;  // for presets that do not have the first one; null for none
 };
 

@@ -50,11 +50,20 @@ const char* muxerFor(const QvPreset& preset, const PresetExtension& row) {
     return nullptr;
 }
 
+// By the symbol, or by the name of one that has none; -1 if it is not installed.
+int indexOf(const QvPresetMgr& catalogue, const char* symbol) {
+    if (const int profile = qvSymToProfile(symbol); profile >= 0) return catalogue.findByProfile(profile);
+    const AnyVector& presets = catalogue.builtinPresets();
+    for (int i = 0; i < presets.size(); ++i)
+        if (presets.at(i).isDict() && presets.at(i).asDict().get("name") == symbol) return i;
+    return -1;
+}
+
 std::shared_ptr<const OutputPreset> byExtension(const PresetExtension& row, const std::string& muxer,
                                                 const std::string& output) {
     const QvPresetMgr& catalogue = *qvPresetMgr();
     for (const char* symbol : row.symbols) {
-        const int index = symbol ? catalogue.findByProfile(qvSymToProfile(symbol)) : -1;
+        const int index = symbol ? indexOf(catalogue, symbol) : -1;
         if (index < 0) continue;
         const QvPreset preset = catalogue.builtinPreset(index);
         if (const char* const own = muxerFor(preset, row))

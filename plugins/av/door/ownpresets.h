@@ -13,7 +13,7 @@ struct OwnPreset {
 
 inline constexpr OwnPreset ownPresets[] = {
     {0x2800001, "AV_WEB_H264", "H.264 for the web", "Web", "h264venc", "aacaenc", "mp4mux"},
-    {0x2800002, "AV_WEB_H265", "H.265", "Web", "h265venc", "aacaenc", "mp4mux mkvmux"},
+    {0x2800002, "AV_WEB_H265", "H.265", "Web", "h265venc", "aacaenc", "mp4mux mkvmux rawmux"},
     {0x2800003, "AV_WEB_AV1", "AV1", "Web", "av1venc", "opusaenc", "webmmux mkvmux"},
     {0x2800004, "AV_MKV_H264", "H.264 in Matroska", "Web", "h264venc", "aacaenc", "mkvmux"},
     {0x2800010, "AV_PRORES", "ProRes master", "Masters", "proresvenc", "mpegpcmenc", "movmux"},

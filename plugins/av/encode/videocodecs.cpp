@@ -40,12 +40,17 @@ constexpr VideoForm ffv1Forms[] = {{I420, AV_PIX_FMT_YUV420P},     {YUYV, AV_PIX
 
 constexpr unsigned predictive = rated | groups | reorders | pixelAspect;
 
+constexpr const char* speeds =
+    " ultrafast superfast veryfast faster fast medium slow slower veryslow placebo ";
+constexpr const char* x264Tunes = " film animation grain stillimage psnr ssim fastdecode zerolatency ";
+constexpr const char* x265Tunes = " psnr ssim grain fastdecode zerolatency animation ";
+
 // clang-format off
 constexpr auto rows = std::to_array<VideoCodec>({
     // module    standard  encoder       forms        fourcc  ext     traits
     //   sides least most step   bits low high usual     quality usual most   preset usual        tune    N    M  most M
     {"h264venc",    "",       "libx264",    x264Forms,   "H264", "264",  predictive | interlaced | setsFirst | borrows | statsFile,
-        16, 16384, 2,   32e3, 800e6, 0,       "crf", 21, 51,      "preset", "medium",         "tune", 250, 4, 17, "", ""},
+        16, 16384, 2,   32e3, 800e6, 0,       "crf", 21, 51,      "preset", "medium",         "tune", 250, 4, 17, "", "", speeds, x264Tunes},
     {"mpegvenc",    "MPEG-2", "mpeg2video", mpeg2Forms,  "MPG2", "m2v",  predictive | interlaced | statsText,
         16, 4096, 2,    100e3, 300e6, 8e6,    "", 0, 0,         "", "",                        "",     15,  3, 8,  "sc_threshold=1000000000", ""},
     {"mpegvenc",    "MPEG-1", "mpeg1video", plainForms,  "MPG1", "m1v",  predictive | statsText,
@@ -61,7 +66,7 @@ constexpr auto rows = std::to_array<VideoCodec>({
     {"mj2kvenc",    "",       "jpeg2000",   j2kForms,    "MJ2K", "j2k",  interlaced,
         16, 8192, 1,    1e6, 2e9, 0,          "", 0, 0,         "", "",                        "",     1,   1, 1,  "format=j2k", ""},
     {"h265venc",    "",       "libx265",    x265Forms,   "HEVC", "265",  predictive | setsFirst | borrows | statsFile,
-        16, 16384, 2,   32e3, 800e6, 0,       "crf", 24, 51,      "preset", "medium",         "tune", 250, 5, 17, "", ""},
+        16, 16384, 2,   32e3, 800e6, 0,       "crf", 24, 51,      "preset", "medium",         "tune", 250, 5, 17, "", "", speeds, x265Tunes},
     {"proresvenc",  "",       "prores_ks",  proresForms, "APCH", "mov",  interlaced,
         16, 16384, 2,   1e6, 4e9, 0,          "", 0, 0,         "", "",                        "",     1,   1, 1,  "vendor=apl0", "hq"},
     {"ffv1venc",    "",       "ffv1",       ffv1Forms,   "FFV1", "mkv",  interlaced,
@@ -74,6 +79,8 @@ constexpr auto rows = std::to_array<VideoCodec>({
 }  // namespace
 
 const VideoForm* VideoCodec::form(unsigned fourcc) const {
+    for (const VideoForm& row : forms)
+        if (row.fourcc == fourcc) return &row;
     for (const VideoForm& row : forms)
         if (qvEqualFourcc(row.fourcc, fourcc)) return &row;
     return nullptr;

@@ -28,7 +28,6 @@ enum : unsigned {
 };
 }
 
-// Statistics of x265 are named in its own parameters.
 struct VideoCodec {
     const char* module;
     const char* standard;  // of several rows of one module; "" for the only one
@@ -47,6 +46,9 @@ struct VideoCodec {
     int usualN, usualM, mostM;
     const char* options;  // always set, "name=value:..."
     const char* profile;  // the usual one of the codec; "" for the library's
+    // Words of preset and tune, each between spaces, where the library finds out late. "": it is asked.
+    const char* presetWords = "";
+    const char* tuneWords = "";
 
     bool has(unsigned trait) const { return (traits & trait) != 0; }
     const VideoForm* form(unsigned fourcc) const;

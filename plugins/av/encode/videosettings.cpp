@@ -144,10 +144,12 @@ int setStandard(S& s, const Any& value) {
 }
 
 // One option of the library by its fixed name, checked there.
-int setNamed(const S& s, const char* option, const Any& value, std::string& to) {
+int setNamed(const S& s, const char* option, const char* words, const Any& value, std::string& to) {
     std::string wanted;
     const AVCodec* const library = s.codec->library();
     if (!library || !qvparam::convert(value, wanted) || wanted.find_first_of(":='\\") != wanted.npos)
+        return QvStatus::invalidParam;
+    if (*words && !wanted.empty() && !std::strstr(words, (" " + wanted + " ").c_str()))
         return QvStatus::invalidParam;
     if (!wanted.empty() && !checkOptions(*library, std::string(option) + "=" + wanted).empty())
         return QvStatus::invalidParam;
@@ -320,17 +322,20 @@ const Row qualityRow = {.name = "crf",
                         .flags = qvParamStored,
                         .help = "constant quality, less is better; -1: by bit rate",
                         .type = Any::Float};
-const Row presetRow = {
-    .name = "preset",
-    .member = Access{[](S& s, const Any& value) { return setNamed(s, s.codec->preset, value, s.preset); },
-                     [](C s, Any& v) { v = textOf(s.preset); }},
-    .flags = qvParamStored,
-    .help = "speed against size, by the library's name",
-    .type = Any::String};
+const Row presetRow = {.name = "preset",
+                       .member = Access{[](S& s, const Any& value) {
+                                            return setNamed(s, s.codec->preset, s.codec->presetWords, value,
+                                                            s.preset);
+                                        },
+                                        [](C s, Any& v) { v = textOf(s.preset); }},
+                       .flags = qvParamStored,
+                       .help = "speed against size, by the library's name",
+                       .type = Any::String};
 const Row tuneRow = {
     .name = "tune",
-    .member = Access{[](S& s, const Any& value) { return setNamed(s, s.codec->tune, value, s.tune); },
-                     [](C s, Any& v) { v = textOf(s.tune); }},
+    .member = Access{
+        [](S& s, const Any& value) { return setNamed(s, s.codec->tune, s.codec->tuneWords, value, s.tune); },
+        [](C s, Any& v) { v = textOf(s.tune); }},
     .flags = qvParamStored,
     .help = "what the pictures are, by the library's name",
     .type = Any::String};
