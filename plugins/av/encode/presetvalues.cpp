@@ -26,7 +26,7 @@ constexpr const char* imx40 =
 constexpr const char* imx30 =
     "flags=+low_delay:intra_vlc=1:non_linear_quant=1:dc=10:qmin=1:qmax=8:bufsize=1200000:rc_init_occupancy="
     "1200000";
-constexpr const char* xdcam = "non_linear_quant=1:dc=10:intra_vlc=1:bufsize=17825792";
+constexpr const char* xdcam = "non_linear_quant=1:qmax=28:dc=10:intra_vlc=1:bufsize=17825792";
 
 // clang-format off
 constexpr PresetVideo rows[] = {
@@ -88,6 +88,9 @@ constexpr PresetVideo rows[] = {
     {"DVCPRO100_1080i", "dv100venc", "", 1440, 1080, false, 0,  25, 1, wide,   0, 0,           0, 0, YUYV, "100",      0,  ""},
     {"DVAVI_DVCPRO100_720p", "dv100venc", "", 960, 720, false, 0, 50, 0, wide, 0, 0,           0, 0, YUYV, "100",      0,  ""},
     {"DVAVI_DVCPRO100_1080i", "dv100venc", "", 1440, 1080, false, 0, 25, 1, wide, 0, 0,        0, 0, YUYV, "100",      0,  ""},
+    {"P2_DVCPRO100_720p", "dvvenc", "", 960, 720,   false, 0,   50, 0, wide,   0, 0,           0, 0, YUYV, "100",      0,  ""},
+    {"P2_DVCPRO100_720p_NATIVE", "dvvenc", "", 960, 720, false, 0, 50, 0, wide, 0, 0,          0, 0, YUYV, "100",      0,  ""},
+    {"P2_DVCPRO100_1080i", "dvvenc", "", 1440, 1080, false, 0,  25, 1, wide,   0, 0,           0, 0, YUYV, "100",      0,  ""},
     {"DCI_LOSSLESS", "mj2kvenc", "",    0, 0,       false, 0,   0,  0, 0,      0, 0,           0, 0, YUYV, "",         0,  "pred=dwt53"},
 };
 // clang-format on

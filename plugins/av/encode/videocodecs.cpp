@@ -60,7 +60,7 @@ constexpr auto rows = std::to_array<VideoCodec>({
     {"vc3venc",     "",       "dnxhd",      dnxForms,    "AVDN", "dnxhd", interlaced,
         256, 8192, 2,   1e6, 2e9, 0,          "", 0, 0,         "", "",                        "",     1,   1, 1,  "", "dnxhr_hq"},
     {"dvvenc",      "",       "dvvideo",    dvForms,     "DVSD", "dv",   interlaced,
-        480, 720, 1,    25e6, 50e6, 0,        "", 0, 0,         "", "",                        "",     1,   1, 1,  "", "25"},
+        480, 1440, 1,   25e6, 100e6, 0,        "", 0, 0,         "", "",                        "",     1,   1, 1,  "", "25"},
     {"dv100venc",   "",       "dvvideo",    dvForms,     "DVH1", "dv",   interlaced,
         720, 1440, 1,   100e6, 100e6, 0,      "", 0, 0,         "", "",                        "",     1,   1, 1,  "", "100"},
     {"mj2kvenc",    "",       "jpeg2000",   j2kForms,    "MJ2K", "j2k",  interlaced,

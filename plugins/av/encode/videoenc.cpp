@@ -108,7 +108,8 @@ int VideoEnc::open() {
 // Tapes have one layout a system.
 AVPixelFormat VideoEnc::layout() const {
     const VideoForm& form = *settings_.codec->form(settings_.type);
-    if (!is(*settings_.codec, "dvvenc") || settings_.codecProfile == "50") return form.layout;
+    if (!is(*settings_.codec, "dvvenc") || settings_.codecProfile == "50" || settings_.codecProfile == "100")
+        return form.layout;
     if (settings_.height == 480 || settings_.codecProfile == "dvcpro25") return AV_PIX_FMT_YUV411P;
     return AV_PIX_FMT_YUV420P;
 }

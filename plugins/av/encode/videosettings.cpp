@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cmath>
 #include <cstring>
+#include <string_view>
 #include <vector>
 
 #include "core/measure/fourcc.h"
@@ -31,10 +32,16 @@ constexpr Rate mpegRates[] = {{23.976, 0}, {24, 0}, {25, 0}, {25, 1}, {25, 2},  
 constexpr Rate tvRates[] = {{25, 2}, {25, 0}, {29.97, 2}, {29.97, 0}};
 constexpr Rate hdTapeRates[] = {{25, 1}, {25, 0}, {29.97, 1}, {29.97, 0}, {50, 0}, {59.94, 0}};
 
+// DV of 100 Mbit/s; under one name, or as a kind of the other.
+bool isHdTape(const S& s) {
+    const std::string_view module = s.codec->module;
+    return module == "dv100venc" || (module == "dvvenc" && s.codecProfile == "100");
+}
+
 std::span<const Rate> ratesOf(const S& s) {
+    if (isHdTape(s)) return hdTapeRates;
     if (std::strcmp(s.codec->module, "mpegvenc") == 0) return mpegRates;
     if (std::strcmp(s.codec->module, "dvvenc") == 0) return tvRates;
-    if (std::strcmp(s.codec->module, "dv100venc") == 0) return hdTapeRates;
     return rates;
 }
 
@@ -50,9 +57,9 @@ AnyDict sizePair(int w, int h) { return AnyDict("w", w, "h", h); }
 
 void sizeRange(const S& s, Any& value) {
     AnyVector sizes;
-    if (std::strcmp(s.codec->module, "dvvenc") == 0)
+    if (!isHdTape(s) && std::strcmp(s.codec->module, "dvvenc") == 0)
         for (const int height : {576, 480}) sizes.append(sizePair(720, height));
-    if (std::strcmp(s.codec->module, "dv100venc") == 0) {
+    if (isHdTape(s)) {
         sizes.append(sizePair(1440, 1080));
         sizes.append(sizePair(1280, 1080));
         sizes.append(sizePair(960, 720));
