@@ -56,7 +56,7 @@ bool holds(std::span<const int> values, int value) {
 
 double bitsPerSecond(C s) {
     if (!s.codec->kilobits.empty()) return s.kilobits * 1000.0;
-    return 8.0 * s.samplerate * s.channels * ((s.bits + 7) / 8);
+    return 1.0 * s.samplerate * s.channels * s.bits;
 }
 
 int setKilobits(S& s, double wanted) {
