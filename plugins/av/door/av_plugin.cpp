@@ -16,6 +16,7 @@ extern "C" QV_API QvPlugin* plugin_init() {
         const auto library = std::make_shared<av::CodecLibrary>();
         av::addDecoders(plugin, library);
         av::addMultiplexers(plugin, library);
+        av::addEncoders(plugin, library);
     }
     plugin.setAttr("version", "1.0");
     plugin.setAttr("versionDate", "2026-11-22");

@@ -1,0 +1,374 @@
+#include "plugins/av/encode/videoenc.h"
+
+#include <algorithm>
+#include <cmath>
+#include <cstring>
+
+#include "core/arch/qvexception.h"
+#include "core/measure/fourcc.h"
+#include "core/media/qvframe.h"
+#include "plugins/av/encode/libraryoptions.h"
+
+namespace av {
+
+namespace {
+
+constexpr int hdLines = 720;  // from here on a picture of unknown matrix counts as BT.709
+constexpr int longestPixel = 255;
+
+std::span<const std::uint8_t> bytesOf(const AVPacket& packet) {
+    return {packet.data, static_cast<std::size_t>(packet.size)};
+}
+
+bool is(const VideoCodec& codec, const char* module) { return std::strcmp(codec.module, module) == 0; }
+
+// The name of each kind of ProRes.
+const char* fourccOf(const AVCodecContext& context, const VideoCodec& codec) {
+    constexpr const char* prores[] = {"APCO", "APCS", "APCN", "APCH", "AP4H", "AP4X"};
+    if (is(codec, "proresvenc") && context.profile >= 0 && context.profile < 6)
+        return prores[context.profile];
+    return codec.fourcc;
+}
+
+unsigned fourccNumber(const char* text) {
+    unsigned value = 0;
+    for (int i = 3; i >= 0; --i) value = value << 8 | static_cast<unsigned char>(text[i]);
+    return value;
+}
+
+}  // namespace
+
+VideoEnc::~VideoEnc() { release(); }
+
+int VideoEnc::setParam(const char* name, const Any& value) {
+    if (std::strcmp(name, "settings") == 0) {
+        _traceParam(name, value);
+        return value.isDict() ? setParamDict(value.asDict()) : QvStatus::invalidParam;
+    }
+    const auto rows = VideoSettings::rows(*settings_.codec);
+    if (std::strcmp(name, "avOptions") == 0 && value.isText()) {
+        const AVCodec* const library = settings_.codec->library();
+        const std::string why = library ? checkOptions(*library, value.toString().asString("")) : "";
+        if (!why.empty()) return setError(QvStatus::invalidParam, "avOptions: %s", why.c_str());
+    }
+    if (auto result = _setRow<VideoSettings>(rows, settings_, name, value)) return *result;
+    return QvVideoEncoder::setParam(name, value);
+}
+
+void VideoEnc::getParam(const char* name, Any& value) const {
+    if (!qvGetParamRow<VideoSettings>(VideoSettings::rows(*settings_.codec), settings_, name, value))
+        QvVideoEncoder::getParam(name, value);
+}
+
+void VideoEnc::store(AnyDict& state) const {
+    AnyDict settings;
+    qvStoreParamRows<VideoSettings>(VideoSettings::rows(*settings_.codec), settings_, settings);
+    if (settings_.most > 0) settings.set("maxVBitrate", settings_.most);
+    state = AnyDict("name", name(), "settingsDict", settings);
+}
+
+int VideoEnc::restore(const AnyDict& state) {
+    if (state.get("name") != name()) return setError(QvStatus::failed, "restore - invalid name");
+    const Any& settings = state.get("settingsDict");
+    if (!settings.isDict()) return QvStatus::ok;
+    const int result =
+        _restoreRows<VideoSettings>(VideoSettings::rows(*settings_.codec), settings_, settings.asDict());
+    const Any& most = settings.asDict().get("maxVBitrate");
+    if (most.isValid() && settings_.codec->has(VideoTrait::rated)) setParam("maxVBitrate", most);
+    return result;
+}
+
+int VideoEnc::fail(const std::string& why) {
+    release();
+    return setError(QvStatus::failed, "%s", why.c_str());
+}
+
+void VideoEnc::release() {
+    context_.reset();
+    packet_.reset();
+    input_.close();
+    files_.remove();
+    statistics_.clear();
+    sets_.clear();
+}
+
+int VideoEnc::open() {
+    if (getState() == qvStateOpen) return setError(QvStatus::failed, "Already open");
+    if (getState() != stateInitialised) return setError(QvStatus::failed, "Not initialized");
+    if (!outStream()) return setError(QvStatus::failed, "Output stream not attached");
+    const std::string why = prepare();
+    if (!why.empty()) return fail(why);
+    output_ = UnitWriter(*outStream());
+    if (!settings_.firstPass && !sendHead()) return fail(output_.problem());
+    frames_ = units_ = 0;
+    setState(qvStateOpen);
+    return QvStatus::ok;
+}
+
+// Tapes have one layout a system.
+AVPixelFormat VideoEnc::layout() const {
+    const VideoForm& form = *settings_.codec->form(settings_.type);
+    if (!is(*settings_.codec, "dvvenc") || settings_.codecProfile == "50" || settings_.codecProfile == "100")
+        return form.layout;
+    if (settings_.height == 480 || settings_.codecProfile == "dvcpro25") return AV_PIX_FMT_YUV411P;
+    return AV_PIX_FMT_YUV420P;
+}
+
+std::string VideoEnc::prepare() {
+    const VideoSettings& s = settings_;
+    const VideoCodec& codec = *s.codec;
+    const AVCodec* const library = codec.library();
+    if (!library) return std::string("The installed library has no encoder ") + codec.encoder;
+    if (s.width < 1 || s.height < 1) return "No size of the picture is set";
+    if (!s.rateKnown) return "No frame rate is set";
+    if (s.width > codec.most || s.height > codec.most || s.width < std::min(codec.least, 16) ||
+        s.height < std::min(codec.least, 16) || s.width % codec.step != 0 || s.height % codec.step != 0)
+        return "The codec does not take pictures of " + std::to_string(s.width) + "x" +
+               std::to_string(s.height);
+    if (s.twoPass && !s.passes) return "There are no statistics of a first pass";
+    context_.reset(avcodec_alloc_context3(library));
+    packet_.reset(av_packet_alloc());
+    if (!context_ || !packet_) return "Out of memory";
+    std::string problem = configure(layout());
+    if (problem.empty()) problem = describeCodec();
+    if (problem.empty()) problem = configureRate();
+    if (problem.empty()) problem = configurePass();
+    if (!problem.empty()) return problem;
+    if (const std::string why = setOptions(*context_, s.profileOptions); !why.empty()) return why;
+    if (const std::string why = setOptions(*context_, s.options); !why.empty()) return why;
+    const int opened = avcodec_open2(context_.get(), library, nullptr);
+    if (opened < 0)
+        return std::string("The encoder does not take these settings (") + codec.encoder + ": " +
+               errorText(opened) + ")";
+    if (!input_.open(s.type, context_->pix_fmt, s.width, s.height, context_->colorspace,
+                     codec.has(VideoTrait::borrows)))
+        return "Frames of this form can not be converted";
+    if (codec.has(VideoTrait::setsFirst) && context_->extradata_size > 0)
+        sets_.assign(context_->extradata, context_->extradata + context_->extradata_size);
+    return "";
+}
+
+std::string VideoEnc::configure(AVPixelFormat layout) {
+    const VideoSettings& s = settings_;
+    AVCodecContext& c = *context_;
+    c.width = s.width;
+    c.height = s.height;
+    c.pix_fmt = layout;
+    c.time_base = {static_cast<int>(s.rate.rate().den), static_cast<int>(s.rate.rate().num)};
+    c.framerate = {c.time_base.den, c.time_base.num};
+    c.sample_aspect_ratio = {1, 1};
+    if (s.frameAspect > 0) c.sample_aspect_ratio = av_d2q(s.frameAspect * s.height / s.width, longestPixel);
+    const bool hd = s.matrix == 2 || (s.matrix == 0 && s.height >= hdLines);
+    const bool film = s.height == 480 || s.height == 512;
+    c.color_range = AVCOL_RANGE_MPEG;
+    c.color_primaries = hd ? AVCOL_PRI_BT709 : film ? AVCOL_PRI_SMPTE170M : AVCOL_PRI_BT470BG;
+    c.color_trc = hd ? AVCOL_TRC_BT709 : AVCOL_TRC_SMPTE170M;
+    c.colorspace = hd ? AVCOL_SPC_BT709 : film ? AVCOL_SPC_SMPTE170M : AVCOL_SPC_BT470BG;
+    if ((av_pix_fmt_desc_get(layout)->flags & AV_PIX_FMT_FLAG_RGB) != 0) {
+        c.colorspace = AVCOL_SPC_RGB;
+        c.color_range = AVCOL_RANGE_JPEG;
+    }
+    c.field_order = AV_FIELD_PROGRESSIVE;
+    if (s.rate.interlaced() != 0) {
+        c.field_order = s.rate.isTopFirst() ? AV_FIELD_TT : AV_FIELD_BB;
+        c.flags |= AV_CODEC_FLAG_INTERLACED_DCT | AV_CODEC_FLAG_INTERLACED_ME;
+    }
+    if (s.codec->has(VideoTrait::setsFirst) || is(*s.codec, "ffv1venc") || is(*s.codec, "av1venc"))
+        c.flags |= AV_CODEC_FLAG_GLOBAL_HEADER;
+    c.thread_count = s.threads;
+    c.strict_std_compliance = FF_COMPLIANCE_UNOFFICIAL;
+    return setOptions(c, s.codec->options);
+}
+
+// The codec's own words: profile, preset, tune.
+std::string VideoEnc::describeCodec() {
+    const VideoSettings& s = settings_;
+    AVCodecContext& c = *context_;
+    const auto set = [&c](const char* name, const std::string& value) {
+        if (value.empty() || !*name) return true;
+        return av_opt_set(&c, name, value.c_str(), AV_OPT_SEARCH_CHILDREN) >= 0;
+    };
+    if (!set(s.codec->preset, s.preset)) return "There is no preset '" + s.preset + "'";
+    if (!set(s.codec->tune, s.tune)) return "There is no tune '" + s.tune + "'";
+    if (is(*s.codec, "dvvenc") || is(*s.codec, "dv100venc")) return "";
+    const VideoForm& form = *s.codec->form(s.type);
+    const std::string profile = form.profile ? form.profile : s.codecProfile;
+    if (!set("profile", profile)) return "There is no profile '" + profile + "'";
+    return "";
+}
+
+std::string VideoEnc::configureRate() {
+    const VideoSettings& s = settings_;
+    AVCodecContext& c = *context_;
+    if (s.codec->has(VideoTrait::groups)) {
+        c.gop_size = s.n;
+        c.max_b_frames = s.codec->has(VideoTrait::reorders) ? std::min(s.m, s.n) - 1 : 0;
+        if (c.gop_size == 1)
+            c.gop_size = s.codec->has(VideoTrait::setsFirst) && s.codec->has(VideoTrait::statsFile) ? 1 : 0;
+        if (s.n > 1 && s.codec->has(VideoTrait::statsText)) c.flags |= AV_CODEC_FLAG_CLOSED_GOP;
+        if (s.m > 1 && is(*s.codec, "h264venc")) av_opt_set(&c, "forced-idr", "1", AV_OPT_SEARCH_CHILDREN);
+    }
+    if (!s.codec->has(VideoTrait::rated)) return "";
+    if (s.byQuality()) {
+        av_opt_set(&c, s.codec->quality, std::to_string(s.quality).c_str(), AV_OPT_SEARCH_CHILDREN);
+        return "";
+    }
+    const double target = s.target > 0 ? s.target : s.codec->usualBits;
+    if (!(target > 0)) return "Neither a quality nor a bit rate is set";
+    c.bit_rate = static_cast<std::int64_t>(target);
+    const bool constant = s.vbr == QvBitrate::cbr;
+    const double most = constant ? target : s.most > target ? s.most : 0;
+    if (most > 0 && !is(*s.codec, "av1venc")) {
+        c.rc_max_rate = static_cast<std::int64_t>(most);
+        // The models of MPEG-2 at main and high level; the others get a second.
+        const bool mpeg = is(*s.codec, "mpegvenc");
+        const double buffer = !mpeg ? most : most <= 15e6 ? 1835008 : 9781248;
+        c.rc_buffer_size = static_cast<int>(std::min(buffer, 2e9));
+    }
+    if (constant && is(*s.codec, "mpegvenc")) c.rc_min_rate = c.rc_max_rate;
+    return "";
+}
+
+std::string VideoEnc::configurePass() {
+    const VideoSettings& s = settings_;
+    AVCodecContext& c = *context_;
+    const bool x265 = is(*s.codec, "h265venc");
+    std::string own = x265 ? "log-level=none:open-gop=0" : "";
+    if (s.passes && s.codec->has(VideoTrait::statsText | VideoTrait::statsFile)) {
+        c.flags |= s.firstPass ? AV_CODEC_FLAG_PASS1 : AV_CODEC_FLAG_PASS2;
+        if (s.codec->has(VideoTrait::statsFile)) {
+            const std::string& name = files_.choose();
+            if (!s.firstPass && !files_.restore(*s.passes)) return "There are no statistics of a first pass";
+            if (x265)
+                own += ":pass=" + std::to_string(s.firstPass ? 1 : 2) + ":stats=" + name;
+            else if (av_opt_set(&c, "stats", name.c_str(), AV_OPT_SEARCH_CHILDREN) < 0)
+                return "Out of memory";
+        } else if (!s.firstPass) {
+            if (!loadPass(*s.passes, 0, statistics_)) return "There are no statistics of a first pass";
+            c.stats_in = statistics_.data();
+        }
+    } else if (s.firstPass) {
+        return "There is no record for the statistics of a first pass";
+    }
+    if (x265 && av_opt_set(&c, "x265-params", own.c_str(), AV_OPT_SEARCH_CHILDREN) < 0)
+        return "Out of memory";
+    return "";
+}
+
+bool VideoEnc::sendHead() {
+    const AVCodecContext& c = *context_;
+    QvWire::VideoHead head{};
+    head.size = sizeof head;
+    head.version = QvWire::version;
+    head.codec = fourccNumber(fourccOf(c, *settings_.codec));
+    const int fields = settings_.rate.interlaced();
+    head.fieldOrder = static_cast<QvWire::FieldOrder>(fields);
+    head.rateNum = c.time_base.den;
+    head.rateDen = c.time_base.num;
+    head.width = c.width;
+    head.height = c.height;
+    head.aspectNum = c.sample_aspect_ratio.num;
+    head.aspectDen = c.sample_aspect_ratio.den;
+    head.primaries = static_cast<std::uint16_t>(c.color_primaries);
+    head.transfer = static_cast<std::uint16_t>(c.color_trc);
+    head.matrix = static_cast<std::uint16_t>(c.colorspace);
+    head.fullRange = c.color_range == AVCOL_RANGE_JPEG ? 1 : 0;
+    head.delay = c.has_b_frames > 0 ? c.has_b_frames : c.max_b_frames > 0 ? 1 : 0;
+    head.profile = c.profile;
+    head.level = c.level;
+    head.extradata = c.extradata;
+    head.extradataBytes = static_cast<std::uint64_t>(std::max(c.extradata_size, 0));
+    return output_.head(head);
+}
+
+int VideoEnc::writeFrame(QvFrame* frame) {
+    if (getState() != qvStateOpen) return setError(QvStatus::illegalState, "Not opened");
+    if (!frame) return setError(QvStatus::invalidArgument, "No frame given");
+    const bool empty = frame->planes() < 1;
+    if (empty || frame->width() != settings_.width || frame->height() != settings_.height ||
+        !qvEqualFourcc(frame->four_cc(), settings_.type))
+        return setError(QvStatus::invalidArgument, "A frame of %dx%d %s does not fit the output of %dx%d",
+                        empty ? 0 : frame->width(), empty ? 0 : frame->height(),
+                        empty ? "no format" : frame->str_four_cc(), settings_.width, settings_.height);
+    AVFrame* const picture = input_.take(*frame);
+    if (!picture) return setError(QvStatus::outOfMemory, "Out of memory");
+    picture->pts = frames_;
+    picture->sample_aspect_ratio = context_->sample_aspect_ratio;
+    picture->color_range = context_->color_range;
+    picture->color_primaries = context_->color_primaries;
+    picture->color_trc = context_->color_trc;
+    picture->colorspace = context_->colorspace;
+    picture->interlaced_frame = settings_.rate.interlaced() != 0;
+    picture->top_field_first = settings_.rate.isTopFirst();
+    const int sent = avcodec_send_frame(context_.get(), picture);
+    if (sent < 0)
+        return setError(QvStatus::failed, "The encoder refused a picture (%s)", errorText(sent).c_str());
+    ++frames_;
+    return drain();
+}
+
+int VideoEnc::drain() {
+    for (;;) {
+        const int got = avcodec_receive_packet(context_.get(), packet_.get());
+        if (got == AVERROR(EAGAIN) || got == AVERROR_EOF) return QvStatus::ok;
+        if (got < 0) return setError(QvStatus::failed, "The encoder failed (%s)", errorText(got).c_str());
+        const int put = putPacket();
+        av_packet_unref(packet_.get());
+        if (put != QvStatus::ok) return put;
+    }
+}
+
+int VideoEnc::putPacket() {
+    ++units_;
+    if (settings_.firstPass) {
+        if (context_->stats_out) statistics_ += context_->stats_out;
+        return QvStatus::ok;
+    }
+    const bool key = (packet_->flags & AV_PKT_FLAG_KEY) != 0;
+    QvWire::VideoUnit unit{};
+    unit.flags = QvWire::unitTimed | (key ? QvWire::unitKey : 0);
+    unit.pts = packet_->pts;
+    unit.dts = packet_->dts != AV_NOPTS_VALUE ? packet_->dts : packet_->pts;
+    unit.duration = 1;
+    const auto sets = key ? std::span<const std::uint8_t>(sets_) : std::span<const std::uint8_t>();
+    if (!output_.unit(sets, bytesOf(*packet_), unit))
+        return setError(QvStatus::failed, "%s", output_.problem().c_str());
+    return QvStatus::ok;
+}
+
+// Statistics in files are whole when the encoder is gone.
+int VideoEnc::finishPass() {
+    if (units_ == 0 && context_->stats_out) statistics_ = context_->stats_out;
+    context_.reset();
+    const bool kept = settings_.codec->has(VideoTrait::statsFile)
+                          ? files_.save(*settings_.passes)
+                          : !statistics_.empty() && storePass(*settings_.passes, 0, statistics_);
+    return kept ? QvStatus::ok
+                : setError(QvStatus::failed, "The statistics of the first pass can not be kept");
+}
+
+int VideoEnc::close() {
+    if (getState() != qvStateOpen) return QvStatus::ok;
+    setState(stateInitialised);
+    int result = QvStatus::ok;
+    // An encoder that never had a picture has nothing that is late.
+    if (frames_ > 0) {
+        avcodec_send_frame(context_.get(), nullptr);
+        result = drain();
+        if (result == QvStatus::ok && !settings_.firstPass && units_ != frames_)
+            result = setError(QvStatus::failed, "The encoder wrote %lld of %lld pictures", units_, frames_);
+        if (result == QvStatus::ok && settings_.firstPass) result = finishPass();
+    }
+    if (result == QvStatus::ok && !settings_.firstPass && !output_.end())
+        result = setError(QvStatus::failed, "%s", output_.problem().c_str());
+    release();
+    return result;
+}
+
+int VideoEnc::abort() {
+    if (getState() == qvStateOpen) setState(stateInitialised);
+    release();
+    return QvStatus::ok;
+}
+
+}  // namespace av

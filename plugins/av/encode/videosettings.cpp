@@ -1,0 +1,404 @@
+#include "plugins/av/encode/videosettings.h"
+
+#include <algorithm>
+#include <cmath>
+#include <cstring>
+#include <string_view>
+#include <vector>
+
+#include "core/measure/fourcc.h"
+#include "plugins/av/encode/libraryoptions.h"
+#include "plugins/av/encode/presetvalues.h"
+
+namespace av {
+
+namespace {
+
+using S = VideoSettings;
+using Row = QvParamRow<S>;
+using Access = QvParamAccess<S>;
+
+struct Rate {
+    double rate;
+    int interlaced;
+};
+constexpr Rate rates[] = {{5, 0},      {6, 0},     {7.5, 0}, {8, 0},      {9, 0},  {10, 0},
+                          {12, 0},     {12.5, 0},  {15, 0},  {16, 0},     {18, 0}, {20, 0},
+                          {23.976, 0}, {24, 0},    {25, 0},  {25, 1},     {25, 2}, {29.97, 0},
+                          {29.97, 1},  {29.97, 2}, {30, 0},  {30, 1},     {48, 0}, {50, 0},
+                          {59.94, 0},  {60, 0},    {100, 0}, {119.88, 0}, {120, 0}};
+constexpr Rate mpegRates[] = {{23.976, 0}, {24, 0}, {25, 0}, {25, 1}, {25, 2},    {29.97, 0}, {29.97, 1},
+                              {29.97, 2},  {30, 0}, {30, 1}, {50, 0}, {59.94, 0}, {60, 0}};
+constexpr Rate tvRates[] = {{25, 2}, {25, 0}, {29.97, 2}, {29.97, 0}};
+constexpr Rate hdTapeRates[] = {{25, 1}, {25, 0}, {29.97, 1}, {29.97, 0}, {50, 0}, {59.94, 0}};
+
+// DV of 100 Mbit/s; under one name, or as a kind of the other.
+bool isHdTape(const S& s) {
+    const std::string_view module = s.codec->module;
+    return module == "dv100venc" || (module == "dvvenc" && s.codecProfile == "100");
+}
+
+std::span<const Rate> ratesOf(const S& s) {
+    if (isHdTape(s)) return hdTapeRates;
+    if (std::strcmp(s.codec->module, "mpegvenc") == 0) return mpegRates;
+    if (std::strcmp(s.codec->module, "dvvenc") == 0) return tvRates;
+    return rates;
+}
+
+void framerateRange(const S& s, Any& value) {
+    AnyVector all;
+    for (const Rate& row : ratesOf(s))
+        if (row.interlaced == 0 || s.codec->has(VideoTrait::interlaced))
+            all.append(QvFramerate(row.rate, row.interlaced));
+    value = all;
+}
+
+AnyDict sizePair(int w, int h) { return AnyDict("w", w, "h", h); }
+
+void sizeRange(const S& s, Any& value) {
+    AnyVector sizes;
+    if (!isHdTape(s) && std::strcmp(s.codec->module, "dvvenc") == 0)
+        for (const int height : {576, 480}) sizes.append(sizePair(720, height));
+    if (isHdTape(s)) {
+        sizes.append(sizePair(1440, 1080));
+        sizes.append(sizePair(1280, 1080));
+        sizes.append(sizePair(960, 720));
+    }
+    if (!sizes.empty())
+        value = sizes;
+    else
+        value = AnyDict("wmin", s.codec->least, "wmax", s.codec->most, "hmin", std::min(s.codec->least, 120),
+                        "hmax", s.codec->most);
+}
+
+int bits(double value) { return static_cast<int>(std::min(value, 2e9)); }
+
+void bitrateRange(const S& s, Any& value) {
+    AnyVector both;
+    for (const int type : {QvBitrate::cbr, QvBitrate::vbr}) {
+        AnyDict row("type", type);
+        row.set("range", AnyVector(bits(s.codec->lowBits), bits(s.codec->highBits)));
+        both.append(row);
+    }
+    value = both;
+}
+
+int setBits(S& s, const Any& value, double S::*member) {
+    double wanted = 0;
+    if (!qvparam::convert(value, wanted) || !(wanted >= 0) || wanted > 4e9) return QvStatus::invalidParam;
+    if (wanted > 0 && (wanted < s.codec->lowBits || wanted > s.codec->highBits))
+        return QvStatus::invalidParam;
+    s.*member = wanted;
+    if (member == &S::target && wanted > 0) s.quality = -1;
+    return QvStatus::ok;
+}
+
+int setQuality(S& s, const Any& value) {
+    double wanted = 0;
+    if (!qvparam::convert(value, wanted) || !(wanted >= -1) || wanted > s.codec->mostQuality)
+        return QvStatus::invalidParam;
+    s.quality = wanted < 0 ? -1 : wanted;
+    return QvStatus::ok;
+}
+
+int setType(S& s, const Any& value) {
+    int wanted = 0;
+    if (!qvparam::convert(value, wanted)) return QvStatus::invalidParam;
+    const VideoForm* const form = s.codec->form(static_cast<unsigned>(wanted));
+    if (!form) return QvStatus::invalidParam;
+    s.type = form->fourcc;
+    return QvStatus::ok;
+}
+
+int setRate(S& s, const Any& value) {
+    QvFramerate wanted;
+    if (!qvparam::convert(value, wanted) || wanted.rate().num < 1 || wanted.rate().den < 1)
+        return QvStatus::invalidParam;
+    if (wanted.interlaced() != 0 && !s.codec->has(VideoTrait::interlaced)) return QvStatus::invalidParam;
+    s.rate = wanted;
+    s.rateKnown = true;
+    return QvStatus::ok;
+}
+
+int setInterlaced(S& s, const Any& value) {
+    int wanted = 0;
+    if (!qvparam::convert(value, wanted) || wanted < 0 || wanted > 2) return QvStatus::invalidParam;
+    if (wanted != 0 && !s.codec->has(VideoTrait::interlaced)) return QvStatus::invalidParam;
+    s.rate.setInterlaced(wanted);
+    return QvStatus::ok;
+}
+
+int setProfile(S& s, const Any& value) {
+    if (!qvparam::convert(value, s.profile)) return QvStatus::invalidParam;
+    s.applyProfile();
+    return QvStatus::ok;
+}
+
+int setPal(S& s, const Any& value) {
+    if (!qvparam::convert(value, s.pal)) return QvStatus::invalidParam;
+    s.applyProfile();
+    return QvStatus::ok;
+}
+
+int setStandard(S& s, const Any& value) {
+    std::string wanted;
+    if (!qvparam::convert(value, wanted)) return QvStatus::invalidParam;
+    const VideoCodec* const row = videoCodec(s.codec->module, wanted.c_str());
+    if (!row) return QvStatus::invalidParam;
+    s.codec = row;
+    if (!row->form(s.type)) s.type = row->forms.front().fourcc;
+    return QvStatus::ok;
+}
+
+// One option of the library by its fixed name, checked there.
+int setNamed(const S& s, const char* option, const char* words, const Any& value, std::string& to) {
+    std::string wanted;
+    const AVCodec* const library = s.codec->library();
+    if (!library || !qvparam::convert(value, wanted) || wanted.find_first_of(":='\\") != wanted.npos)
+        return QvStatus::invalidParam;
+    if (*words && !wanted.empty() && !std::strstr(words, (" " + wanted + " ").c_str()))
+        return QvStatus::invalidParam;
+    if (!wanted.empty() && !checkOptions(*library, std::string(option) + "=" + wanted).empty())
+        return QvStatus::invalidParam;
+    to = wanted;
+    return QvStatus::ok;
+}
+
+int setPasses(S& s, const Any& value) {
+    if (value.isValid() && !value.isGeneric()) return QvStatus::invalidParam;
+    s.passes = value.isValid() ? static_cast<bufstream*>(const_cast<void*>(value.asGeneric())) : nullptr;
+    return QvStatus::ok;
+}
+
+Any textOf(const std::string& text) { return Any(text.c_str()); }
+
+void allowedTypes(const S& s, Any& value) {
+    AnyVector all;
+    for (const VideoForm& form : s.codec->forms)
+        all.append(AnyDict("type", static_cast<int>(form.fourcc), "name", qvFourccText(form.fourcc).data()));
+    value = all;
+}
+
+double aspectOf(const S& s) {
+    if (s.frameAspect > 0 || s.height == 0) return s.frameAspect;
+    return static_cast<double>(s.width) / s.height;
+}
+
+double nominalBits(const S& s) { return s.target > 0 ? s.target : s.codec->usualBits; }
+
+template <int number>
+void fixed(const S&, Any& value) {
+    value = number;
+}
+
+using C = const S&;
+const Row commonRows[] = {
+    {.name = "standard",
+     .member = Access{setStandard, [](C s, Any& v) { v = s.codec->standard; }},
+     .flags = qvParamStored,
+     .help = "MPEG-2 or MPEG-1, of an encoder of both",
+     .type = Any::String},
+    {.name = "profile",
+     .member = Access{setProfile, [](C s, Any& v) { v = s.profile; }},
+     .flags = qvParamStored,
+     .help = "number of a preset, which sets what it stands for",
+     .type = Any::Int32},
+    {.name = "pal",
+     .member = Access{setPal, [](C s, Any& v) { v = s.pal ? 1 : 0; }},
+     .flags = qvParamStored,
+     .help = "1: size and rate of a preset for television are those of 50 Hz",
+     .type = Any::Int32},
+    {"width", &S::width, qvParamStored, 0, 16384, "", "pixels", "0: not set"},
+    {"height", &S::height, qvParamStored, 0, 16384, "", "pixels", "0: not set"},
+    {.name = "framerate",
+     .member = Access{setRate,
+                      [](C s, Any& v) {
+                          if (s.rateKnown) v = s.rate;
+                      }},
+     .flags = qvParamStored,
+     .help = "a frame rate, or frames/s",
+     .type = Any::Framerate},
+    {.name = "interlaced",
+     .member = Access{setInterlaced, [](C s, Any& v) { v = s.rate.interlaced(); }},
+     .min = 0,
+     .max = 2,
+     .help = "0 progressive, 1 top field first, 2 bottom field first",
+     .type = Any::Int32},
+    {"frameAspect", &S::frameAspect, qvParamStored, 0, 100, "", "", "width to height; 0: square pixels"},
+    {.name = "type",
+     .member = Access{setType, [](C s, Any& v) { v = static_cast<int>(s.type); }},
+     .flags = qvParamStored,
+     .help = "FOURCC of the frames that are taken",
+     .type = Any::Int32},
+    {"colourMatrix", &S::matrix, qvParamStored, 0, 2, "", "", "1 BT.601, 2 BT.709; 0: by the lines"},
+    {"threads", &S::threads, qvParamStored, 0, 64, "", "", "of the codec; 0: one a core"},
+    {.name = "codecProfile",
+     .member = &S::codecProfile,
+     .flags = qvParamStored,
+     .help = "the codec's own profile by the library's name"},
+    {.name = "avOptions",
+     .member = Access{[](S& s, const Any& value) {
+                          std::string wanted;
+                          const AVCodec* const library = s.codec->library();
+                          if (!library || !qvparam::convert(value, wanted)) return QvStatus::invalidParam;
+                          if (!checkOptions(*library, wanted).empty()) return QvStatus::invalidParam;
+                          s.options = wanted;
+                          return QvStatus::ok;
+                      },
+                      [](C s, Any& v) { v = textOf(s.options); }},
+     .flags = qvParamStored,
+     .help = "options of the library, name=value:name=value",
+     .type = Any::String},
+    {.name = "meta",
+     .member = Access{setPasses, nullptr},
+     .flags = qvParamWriteOnly,
+     .help = "the record of a first pass",
+     .type = Any::Generic},
+    {"chapters", {}, qvParamIgnored},
+    {"topFirst", {}, qvParamIgnored},
+    {"accelerationType", {}, qvParamIgnored},
+    {"selectedFOURCC", Access{nullptr, [](C s, Any& v) { v = static_cast<int>(s.type); }}},
+    {"allowedTypes", Access{nullptr, allowedTypes}},
+    {"sizeRange", Access{nullptr, sizeRange}},
+    {"framerateRange", Access{nullptr, framerateRange}},
+    {"aspectRange", Access{nullptr, [](C, Any& v) { v = AnyDict("min", 0.1, "max", 10.0); }}},
+    {"pixelAspect",
+     Access{nullptr,
+            [](C s, Any& v) { v = s.width > 0 && s.height > 0 ? aspectOf(s) * s.height / s.width : 1.0; }}},
+    {"extension", Access{nullptr, [](C s, Any& v) { v = s.codec->extension; }}},
+    {"twoPassPossible",
+     Access{nullptr,
+            [](C s, Any& v) {
+                const bool keeps = s.codec->has(VideoTrait::statsText | VideoTrait::statsFile);
+                v = keeps && !s.byQuality() ? 1 : 0;
+            }}},
+    {"canChangeDominance", Access{nullptr, fixed<1>}},
+    {"previewPossible", Access{nullptr, fixed<0>}},
+    {"srPossible", Access{nullptr, fixed<0>}},
+    {"_isAVCHD", Access{nullptr, fixed<0>}},
+    {"_needTopBlanking", Access{nullptr, [](C s, Any& v) { v = s.topLines; }}},
+    {"pulldown", Access{nullptr, fixed<0>}},
+};
+
+const Row groupRows[] = {
+    {"N", &S::n, qvParamStored, 1, 1000, "", "pictures", "from one key frame to the next at most"},
+    {.name = "M",
+     .member = Access{[](S& s, const Any& value) {
+                          int wanted = 0;
+                          if (!qvparam::convert(value, wanted) || wanted < 1 || wanted > s.codec->mostM)
+                              return QvStatus::invalidParam;
+                          s.m = wanted;
+                          return QvStatus::ok;
+                      },
+                      [](C s, Any& v) { v = s.m; }},
+     .flags = qvParamStored,
+     .help = "from one anchor picture to the next; 1: no B-frames",
+     .type = Any::Int32},
+    {"gopRange",
+     Access{nullptr,
+            [](C s, Any& v) { v = AnyDict("minM", 1, "maxM", s.codec->mostM, "minN", 1, "maxN", 1000); }}},
+};
+
+const Row rateRows[] = {
+    {"vbr", &S::vbr, qvParamStored, 0, 4, "", "", "0 constant, 1 variable"},
+    {.name = "vBitrate",
+     .member = Access{[](S& s, const Any& value) { return setBits(s, value, &S::target); },
+                      [](C s, Any& v) { v = nominalBits(s); }},
+     .flags = qvParamStored,
+     .unit = "bit/s",
+     .type = Any::Float},
+    {.name = "maxVBitrate",
+     .member = Access{[](S& s, const Any& value) { return setBits(s, value, &S::most); },
+                      [](C s, Any& v) { v = s.most > 0 ? s.most : nominalBits(s); }},
+     .unit = "bit/s",
+     .type = Any::Float},
+    {"minVBitrate", &S::least, qvParamStored, 0, 4e9, "", "bit/s"},
+    {"bitrateRange", Access{nullptr, bitrateRange}},
+    {"vBitrateRange",
+     Access{nullptr, [](C s, Any& v) { v = AnyVector(bits(s.codec->lowBits), bits(s.codec->highBits)); }}},
+    {"estimateSecKb",
+     Access{nullptr, [](C s, Any& v) { v = Any(static_cast<float>(nominalBits(s) / 8000)); }}},
+    {"twoPass", &S::twoPass, qvParamPlain},
+    {.name = "firstPass",
+     .member = &S::firstPass,
+     .help = "1: writes statistics into the record and no stream"},
+};
+
+const Row qualityRow = {.name = "crf",
+                        .member = Access{setQuality, [](C s, Any& v) { v = s.quality; }},
+                        .flags = qvParamStored,
+                        .help = "constant quality, less is better; -1: by bit rate",
+                        .type = Any::Float};
+const Row presetRow = {.name = "preset",
+                       .member = Access{[](S& s, const Any& value) {
+                                            return setNamed(s, s.codec->preset, s.codec->presetWords, value,
+                                                            s.preset);
+                                        },
+                                        [](C s, Any& v) { v = textOf(s.preset); }},
+                       .flags = qvParamStored,
+                       .help = "speed against size, by the library's name",
+                       .type = Any::String};
+const Row tuneRow = {
+    .name = "tune",
+    .member = Access{
+        [](S& s, const Any& value) { return setNamed(s, s.codec->tune, s.codec->tuneWords, value, s.tune); },
+        [](C s, Any& v) { v = textOf(s.tune); }},
+    .flags = qvParamStored,
+    .help = "what the pictures are, by the library's name",
+    .type = Any::String};
+
+std::vector<Row> tableOf(const VideoCodec& codec) {
+    std::vector<Row> table(std::begin(commonRows), std::end(commonRows));
+    if (codec.has(VideoTrait::groups)) table.insert(table.end(), std::begin(groupRows), std::end(groupRows));
+    if (codec.has(VideoTrait::rated)) table.insert(table.end(), std::begin(rateRows), std::end(rateRows));
+    if (*codec.quality) table.push_back(qualityRow);
+    if (*codec.preset) table.push_back(presetRow);
+    if (*codec.tune) table.push_back(tuneRow);
+    return table;
+}
+
+}  // namespace
+
+VideoSettings::VideoSettings(const VideoCodec& row)
+    : codec(&row),
+      type(row.forms.front().fourcc),
+      quality(*row.quality ? row.usualQuality : -1),
+      n(row.usualN),
+      m(row.usualM),
+      preset(row.usualPreset),
+      codecProfile(row.profile) {}
+
+// Four kinds of tables are enough: what a codec has follows from its traits.
+std::span<const QvParamRow<VideoSettings>> VideoSettings::rows(const VideoCodec& codec) {
+    static const std::vector<Row> quality = tableOf(*videoCodec("h264venc"));
+    static const std::vector<Row> rated = tableOf(*videoCodec("mpegvenc"));
+    static const std::vector<Row> plain = tableOf(*videoCodec("ffv1venc"));
+    return *codec.quality ? quality : codec.has(VideoTrait::rated) ? rated : plain;
+}
+
+void VideoSettings::applyProfile() {
+    const PresetVideo* const row = presetVideo(profile, codec->module);
+    if (!row) return;
+    if (*row->standard) setStandard(*this, Any(row->standard));
+    if (row->width > 0) {
+        width = row->width;
+        height = row->television && !pal ? row->height60 : row->height;
+    }
+    if (row->rate > 0)
+        setRate(*this, Any(QvFramerate(row->television && !pal ? 29.97 : row->rate, row->interlaced)));
+    if (row->target > 0) {
+        target = row->target;
+        most = row->most;
+        vbr = row->most > row->target ? QvBitrate::vbr : QvBitrate::cbr;
+        quality = -1;
+    }
+    if (row->n > 0) n = row->n;
+    if (row->m > 0) m = row->m;
+    frameAspect = row->aspect;
+    topLines = row->topLines;
+    if (row->type) setType(*this, Any(static_cast<int>(row->type)));
+    if (*row->codecProfile) codecProfile = row->codecProfile;
+    profileOptions = row->options;
+}
+
+}  // namespace av
