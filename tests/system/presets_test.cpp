@@ -152,7 +152,7 @@ TEST_F(Presets, ComeFromFilesOfBothForms) {
                                 older("Old", "rawvenc") + older("RAW", "rawvenc") +
                                 older("Alien", "alienenc") + "</vec></dict></userprofiles>");
     EXPECT_THAT(
-        works({"presets", "import", "old.xml"}).err,
+        works(bare({"presets", "import", "old.xml"})).err,
         AllOf(HasSubstr("'Old' converted to the profile RAW"), HasSubstr("'RAW' renamed to 'RAW (1)'"),
               HasSubstr("kipping preset 'Alien"), HasSubstr("imported 2 of 3")));
     EXPECT_THAT(works({"presets", "check"}).err, HasSubstr("5 presets"));
@@ -215,11 +215,11 @@ TEST_F(Presets, FilesOfOthersAreTakenWithCare) {
                                 text("name", "Gone") + "<key>params</key><dict>" + number("origProfile", 14) +
                                 part("video", "h264venc") + part("mux", "rawmux") +
                                 "</dict></dict></vec></dict></userprofiles>");
-    EXPECT_THAT(works({"presets", "import", "old.xml"}).err,
+    EXPECT_THAT(works(bare({"presets", "import", "old.xml"})).err,
                 AllOf(HasSubstr("'Gone' is hidden"), HasSubstr("kipping preset, it is no dictionary"),
                       HasSubstr("imported 1 of 2")));
-    EXPECT_THAT(works({"presets"}).out, Not(HasSubstr("Gone")));
-    const Outcome lost = tarsel({"presets", "check", "old.xml"});
+    EXPECT_THAT(works(bare({"presets"})).out, Not(HasSubstr("Gone")));
+    const Outcome lost = tarsel(bare({"presets", "check", "old.xml"}));
     EXPECT_THAT(lost.err, AllOf(HasSubstr("kipping preset, it is no dictionary"), HasSubstr("2 of them")));
     EXPECT_EQ(lost.status, 5);
     // A store of the older form is not written anew without what can't be read of it.

@@ -26,7 +26,8 @@ inline constexpr OwnPreset ownPresets[] = {
     {0x2800023, "AV_OPUS", "Opus", "Sound", "", "opusaenc", "oggmux"},
     // What is asked for by the names of codecs alone.
     {0x2800030, "AV_ANY", "Any codecs", "Any",
-     "h264venc h265venc av1venc mpegvenc mpeg4venc vc3venc dvvenc dv100venc mj2kvenc proresvenc ffv1venc rawvenc",
+     "h264venc h265venc av1venc mpegvenc mpeg4venc vc3venc dvvenc dv100venc mj2kvenc proresvenc ffv1venc "
+     "rawvenc",
      "aacaenc mpegaenc mpegpcmenc mp3aenc ddaenc ddproaenc ddplusproaenc flacaenc opusaenc rawaenc",
      "mkvmux movmux mp4mux mxfmux mptsmux mpegpsmux webmmux dvavimux dvmux y4mmux flacmux oggmux rawmux"},
 };
