@@ -27,6 +27,9 @@ void checkOutputFiles(const JobParts& parts) {
     for (const PlannedStream& s : parts.plan.streams) {
         const QvBufStream* file = parts.file(s);
         if (!file || file->ioError() == 0) continue;
+        // A multiplexer that refuses what it gets has a reason of its own.
+        if (file->ioError() == EINVAL && parts.pipe->getMuxer() && parts.pipe->getMuxer()->errorCode() != 0)
+            continue;
         if (parts.outputs.stream() && file->ioError() == EPIPE)
             throw failure(Msg::streamReaderGone, {parts.plan.output.name});
         throw systemFailure(Msg::outputSystem, parts.plan.output.name, file->ioError());
@@ -35,10 +38,11 @@ void checkOutputFiles(const JobParts& parts) {
 
 // What the first member of the output that failed says; empty if none did.
 std::string outputReason(const JobParts& parts) {
-    std::vector<const QvCodec*> members;
-    for (const PlannedStream& s : parts.plan.streams) members.push_back(parts.encoder(s));
     QvEncodePipe& pipe = *parts.pipe;
-    members.insert(members.end(), {pipe.getMuxer(), pipe.sink(), &pipe});
+    // What an encoder says of its output comes from the multiplexer.
+    std::vector<const QvCodec*> members = {pipe.getMuxer()};
+    for (const PlannedStream& s : parts.plan.streams) members.push_back(parts.encoder(s));
+    members.insert(members.end(), {pipe.sink(), &pipe});
     std::string reason;
     for (const QvCodec* member : members)
         if (reason.empty() && member && member->errorCode() != 0) reason = member->errorDesc();

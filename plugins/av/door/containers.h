@@ -13,6 +13,7 @@ struct MuxerModule {
     const char* extensions;  // of files, separated by spaces; the first is the usual one
     const char* encoders;    // modules whose streams it takes, likewise
     bool transportStream = false;
+    int samplerate = 0;  // the only rate of sound that it holds; 0: any
 };
 
 // clang-format off
@@ -26,13 +27,13 @@ inline constexpr auto muxerModules = std::to_array<MuxerModule>({
     {"webmmux", "WebM multiplexer", "WebM", "webm weba",
      "av1venc opusaenc"},
     {"mxfmux", "MXF multiplexer", "MXF", "mxf",
-     "mpegvenc vc3venc dvvenc dv100venc mj2kvenc proresvenc mpegpcmenc rawaenc"},
+     "mpegvenc vc3venc dvvenc dv100venc mj2kvenc proresvenc mpegpcmenc rawaenc", false, 48000},
     {"mptsmux", "MPEG transport stream multiplexer", "MPEG-TS", "ts m2ts mts",
      "h264venc h265venc mpegvenc mpeg4venc aacaenc mpegaenc mp3aenc ddaenc ddproaenc ddplusproaenc opusaenc", true},
     {"mpegpsmux", "MPEG program stream multiplexer", "MPEG-PS", "mpg vob mpeg",
      "h264venc mpegvenc mpegaenc mp3aenc ddaenc ddproaenc mpegpcmenc rawaenc"},
     {"dvmux", "DV stream multiplexer", "DV", "dv",
-     "dvvenc dv100venc mpegpcmenc rawaenc"},
+     "dvvenc dv100venc mpegpcmenc rawaenc", false, 48000},
     {"dvavimux", "AVI multiplexer", "AVI", "avi",
      "dvvenc dv100venc mpeg4venc ffv1venc rawvenc mpegaenc mp3aenc ddaenc ddproaenc mpegpcmenc rawaenc"},
     {"y4mmux", "YUV4MPEG2 multiplexer", "YUV4MPEG2", "y4m",

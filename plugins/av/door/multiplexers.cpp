@@ -28,6 +28,7 @@ void addMultiplexers(QvPlugin& plugin, const std::shared_ptr<CodecLibrary>& libr
         module->setAttr("exts", words(row.extensions));
         module->setAttr("compatEncoders", words(row.encoders));
         module->setAttr("sizedStreams", 1);
+        if (row.samplerate > 0) module->setAttr("samplerates", AnyVector(Any(row.samplerate)));
         if (row.transportStream) module->setAttr("transportStream", 1);
         plugin.addModule(module);
     }

@@ -4,6 +4,8 @@
 #include <climits>
 #include <cstring>
 #include <functional>
+#include <string_view>
+#include <utility>
 
 #include "core/arch/qvassert.h"
 #include "core/engine/files/qvfileutil.h"
@@ -39,6 +41,9 @@ constexpr QvParamRow<Settings> settingRows[] = {
      .flags = qvParamStored,
      .help = "of sound without one, three letters"},
     {.name = "filename", .member = &Settings::filename, .help = "of the output", .type = Any::String},
+    {"samplerate", &Settings::samplerate, qvParamStored, 1, 768000, "", "Hz"},
+    {"channels", &Settings::channels, qvParamStored, 1, 64},
+    {"bitsPerSample", &Settings::bitsPerSample, qvParamStored, 8, 32},
     {"_totalFrames", &Settings::totalFrames, qvParamWriteOnly, 0, INT_MAX, "", "",
      "pictures to come, 0: not known"},
     {.name = "meta", .member = &Settings::meta, .help = "title, timecode, chapters and the like"},
@@ -61,19 +66,8 @@ AnyVector codecs(const Multiplexer& muxer, int kind) {
     return presets ? presets->getCompatible(muxer.name(), kind) : AnyVector();
 }
 
-double secondKilobytes(const Multiplexer& muxer) {
-    double sum = 0;
-    for (const int type : {qvVideoStream, qvAudioStream})
-        for (int nr = 0; nr < muxer.nrStreams(type); ++nr)
-            if (const auto* const encoder = muxer.stream(type, nr)->atachee()) {
-                const Any part = encoder->getParam("estimateSecKb");
-                if (part.isInt() || part.isFloat()) sum += part.toDouble();
-            }
-    return sum;
-}
-
 constexpr QvParamRow<Multiplexer> answerRows[] = {
-    {"estimateSecKb", Answer{nullptr, [](const Multiplexer& m, Any& v) { v = secondKilobytes(m); }}},
+    {"estimateSecKb", Answer{nullptr, [](const Multiplexer& m, Any& v) { v = m.secondKilobytes(); }}},
     {"videoCodecs",
      Answer{nullptr, [](const Multiplexer& m, Any& v) { v = codecs(m, QvModuleType::videoEncoder); }}},
     {"audioCodecs",
@@ -90,7 +84,8 @@ bool isRaw(const QvCodec& encoder) {
     if (!module) return false;
     const Any attribute = module->getAttr("uncompressed");
     if (attribute.isValid()) return attribute.isTrue();
-    return std::strcmp(module->name(), "rawvenc") == 0 || std::strcmp(module->name(), "rawaenc") == 0;
+    const std::string_view name = module->name();
+    return name == "rawvenc" || name == "rawaenc" || name == "dummyaenc";
 }
 
 std::string lower(std::string text) {
@@ -109,6 +104,22 @@ std::string textOf(const Any& value) {
 Multiplexer::Multiplexer(const Container& container) : container_(container) {}
 
 Multiplexer::~Multiplexer() { end(); }
+
+double Multiplexer::secondKilobytes() const {
+    if (std::exchange(asking_, true))
+        return 0;  // by an encoder that passes the question on to its multiplexer
+    double sum = 0;
+    for (const int type : {qvVideoStream, qvAudioStream})
+        for (int nr = 0; nr < nrStreams(type); ++nr)
+            if (const auto* const encoder = stream(type, nr)->atachee()) {
+                const Any part = encoder->getParam("estimateSecKb");
+                if (part.isInt() || part.isFloat()) sum += part.toDouble();
+            }
+    asking_ = false;
+    return sum;
+}
+
+void Multiplexer::refuse(const std::string& problem) { setError(QvStatus::failed, "%s", problem.c_str()); }
 
 // --- Parameters.
 

@@ -20,6 +20,8 @@ class FilmWriter;
 //                             BUF_SEEK_INFO; 0: what is written stays, as in a pipe; -1: 1 for a file
 //   "fastStart"  1            MP4: the index is at the front, if the number of frames is known before
 //   "avOptions"  ""           options of the libraries' container, "name=value:name=value"
+//   "samplerate", "channels", "bitsPerSample"
+//                48000, 2, 16 what "dummyaenc" passes on: the form of samples that come without an encoder
 //   "language"   ""           of all streams of sound that have none, ISO 639-2
 //   "meta"       Dict         see setFilmWords
 //
@@ -30,6 +32,7 @@ class Multiplexer : public BaseMuxer {
         int seekable = -1;
         bool fastStart = true;
         int totalFrames = 0;
+        int samplerate = 48000, channels = 2, bitsPerSample = 16;  // of sound that has no encoder of its own
         std::string avOptions, language;
         Any filename;
         AnyDict meta;
@@ -39,6 +42,10 @@ class Multiplexer : public BaseMuxer {
     ~Multiplexer() override;
 
     const Container& container() const { return container_; }
+    // What its encoders estimate, in kilobytes a second.
+    double secondKilobytes() const;
+    // Makes that its error, for a stream that failed.
+    void refuse(const std::string& problem);
 
     int setParam(const char* name, const Any& value) override;
     void getParam(const char* name, Any& value) const override;
@@ -62,7 +69,8 @@ class Multiplexer : public BaseMuxer {
     const Container& container_;
     Settings settings_;
     std::unique_ptr<FilmWriter> film_;
-    bool file_ = false;  // the output is one whose contents can be read again
+    mutable bool asking_ = false;  // its encoders for their rates
+    bool file_ = false;            // the output is one whose contents can be read again
 
     std::string extension() const;
     bool regularFile() const;

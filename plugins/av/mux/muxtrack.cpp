@@ -172,6 +172,10 @@ bool MuxTrack::describe(const QvWire::AudioHead& head) {
         return fail("there is no sound of " + std::to_string(head.rate) + " Hz and " +
                     std::to_string(head.channels) + " channels");
     if (!choose(muxCodec(head.codec), head.codec)) return false;
+    const MuxerModule& module = container_->module();
+    if (module.samplerate > 0 && head.rate != module.samplerate)
+        return fail(std::string(module.displayName) + " holds sound of " + std::to_string(module.samplerate) +
+                    " Hz, not of " + std::to_string(head.rate) + " Hz");
     AVCodecParameters& to = *parameters_;
     to.sample_rate = head.rate;
     timeBase_ = {1, head.rate};

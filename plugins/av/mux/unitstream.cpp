@@ -11,6 +11,7 @@
 #include "core/stream/buf_impl_base.h"
 #include "core/stream/iofailure.h"
 #include "plugins/av/mux/filmwriter.h"
+#include "plugins/av/mux/multiplexer.h"
 #include "plugins/av/source/limits.h"
 
 namespace av {
@@ -200,6 +201,7 @@ class UnitStream::Record final : public Bufstream {
     void noteFailure() {
         const Any name = stream_.getParam("outfilename");
         const auto code = film_.outputFailed() ? EIO : EINVAL;
+        if (!film_.outputFailed()) static_cast<Multiplexer*>(stream_.owner())->refuse(film_.problem());
         stream_.failure()->note(code, film_.problem().c_str(),
                                 name.isText() ? qv_wide_name(qv_os_name(name)) : QvWideString());
     }

@@ -38,6 +38,16 @@ void setSound(QvEncoder& encoder, const SoundFormat& sound) {
     setChecked(encoder, "bitsPerSample", sound.bits, "--bits");
 }
 
+// The rate, or the first that a container holds if it does not hold that one.
+int rateIn(const char* muxer, int samplerate) {
+    const QvModule* const module = muxer ? qv_registry()->module(muxer) : nullptr;
+    const Any rates = module ? module->getAttr("samplerates") : Any();
+    if (!rates.isVector() || rates.asVector().empty()) return samplerate;
+    for (const Any& rate : rates.asVector())
+        if (rate == Any(samplerate)) return samplerate;
+    return rates.asVector().at(0).asInt32(samplerate);
+}
+
 }  // namespace
 
 void setFormat(QvEncoder& encoder, const PlannedStream& stream) {
@@ -102,6 +112,7 @@ void PresetPlanner::takeSound(PlannedStream& stream, const QvCodec& encoder) con
     const PresetSound asked = plan_.preset->sound(encoder, stream.number, static_cast<bool>(options_.fit));
     SoundFormat& sound = stream.sound;
     if (!options_.samplerate && asked.samplerate) sound.samplerate = *asked.samplerate;
+    if (!options_.samplerate) sound.samplerate = rateIn(plan_.output.muxer(), sound.samplerate);
     if (!options_.channels && options_.sound.map.empty() && asked.channels) sound.channels = *asked.channels;
     if (!options_.bits && asked.bits) sound.bits = *asked.bits;
 }
