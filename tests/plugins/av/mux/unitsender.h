@@ -68,6 +68,7 @@ class UnitSender {
 
     bool addTo(QvMuxer& muxer) {
         for (Stream& stream : streams) {
+            stream.encoder = std::make_unique<Encoder>();  // one before knows a stream that has gone
             stream.to = muxer.addStream(stream.video ? qvVideoStream : qvAudioStream, AnyDict());
             if (!stream.to) return false;
             stream.encoder->attachOutStream(stream.to);
