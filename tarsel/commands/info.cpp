@@ -117,9 +117,7 @@ void describeWords(const QvDecodePipe& decoder, Json& file) {
 void describeFilm(const QvDecodePipe& decoder, Json& file) {
     const Any meta = static_cast<const QvCodec&>(decoder).getParam("meta");
     if (!meta.isDict()) return;
-    for (const auto [key, value] : meta.asDict())
-        if (value->isText() && std::string(key) != "startTimecode")
-            file["meta"][key] = validUtf8(text(*value));
+    if (const Json words = plainJson(meta.asDict()); !words.empty()) file["meta"] = words;
     const Any& chapters = meta.asDict().get("chapters");
     if (!chapters.isVector()) return;
     for (const Any& chapter : chapters.asVector()) {
@@ -144,8 +142,6 @@ Json describe(const Source& source) {
             file["streams"].push_back(describeStream(source.decoder(), type, i));
     const std::string damage = source.damage();
     if (!damage.empty()) file["damage"] = damage;
-    const Any meta = source.decoder().QvCodec::getParam("meta");
-    if (meta.isDict() && !meta.asDict().empty()) file["meta"] = plainJson(meta.asDict());
     describeWords(source.decoder(), file);
     describeFilm(source.decoder(), file);
     return file;
@@ -212,10 +208,6 @@ void printWords(const Json& file) {
     const auto part = [](const Json& object, const char* key) {
         return object.contains(key) ? oneLine(object[key]) : std::string();
     };
-    if (file.contains("meta"))
-        for (const auto& [label, key] :
-             {std::pair("title", "title"), {"clip", "clipName"}, {"timecode", "timecode"}})
-            printWord(label, part(file["meta"], key));
     if (file.contains("bext")) {
         const Json& bext = file["bext"];
         printWord("about", part(bext, "description"));
@@ -237,8 +229,9 @@ void printWords(const Json& file) {
         for (const Json& cue : file["cues"])
             printWord("cue", "sample " + part(cue, "position") +
                                  (cue.contains("label") ? ", " + part(cue, "label") : ""));
-    if (file.contains("meta"))
-        for (const auto& [key, value] : file["meta"].items()) printWord(key.c_str(), oneLine(value));
+    if (file.contains("meta"))  // the engine reads "startTimecode", which says no more than "timecode"
+        for (const auto& [key, value] : file["meta"].items())
+            if (key != "startTimecode") printWord(key == "clipName" ? "clip" : key.c_str(), oneLine(value));
     if (file.contains("chapters"))
         for (const Json& chapter : file["chapters"])
             printWord("chapter", formatTime(chapter["time_s"].get<double>()) +
