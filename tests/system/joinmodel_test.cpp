@@ -1,5 +1,6 @@
 // Random joins next to a model of them that is written here: which frames and samples come out, by the job,
-// by its task file, and by a run after one that was killed. QV_JOINS and QV_SEED choose how many and which.
+// by its task file, and by a run after one that was killed. The inputs are the engine's own forms, or
+// lossless films of the same pictures and sound. QV_JOINS and QV_SEED choose how many and which.
 #include <cstdlib>
 #include <map>
 #include <random>
@@ -20,21 +21,23 @@ Fraction over(const Fraction& a, const Fraction& b) { return {a.num * b.den, a.d
 
 struct Input {
     const char* name;
-    int side;       // of the picture, which is a square; 0 without one
-    Fraction rate;  // frames a second
+    const char* film;  // of the same content
+    int side;          // of the picture, which is a square; 0 without one
+    Fraction rate;     // frames a second
     Number frames;
     int samplerate;  // 0 without sound
     int channels;
     Number samples;
 };
 constexpr Input kInputs[] = {
-    {"p.yuv", 32, {30000, 1001}, 120, 0, 0, 0},
-    {"testgen:size=64x64,rate=25,duration=4", 64, {25, 1}, 100, 44100, 2, 176400},
-    {"testgen:size=48x48,rate=24,duration=4,audio=0", 48, {24, 1}, 96, 0, 0, 0},
-    {"s44.wav", 0, {}, 0, 44100, 2, 220500},
-    {"s48.wav", 0, {}, 0, 48000, 1, 240000},
+    {"p.yuv", "p.mp4", 32, {30000, 1001}, 120, 0, 0, 0},
+    {"testgen:size=64x64,rate=25,duration=4", "t.mov", 64, {25, 1}, 100, 44100, 2, 176400},
+    {"testgen:size=48x48,rate=24,duration=4,audio=0", "u.mkv", 48, {24, 1}, 96, 0, 0, 0},
+    {"s44.wav", "s44.flac", 0, {}, 0, 44100, 2, 220500},
+    {"s48.wav", "s48.m4a", 0, {}, 0, 48000, 1, 240000},
 };
-constexpr int kNothing = -1;  // the place of what a segment lacks
+constexpr const char* kRaw[] = {"p.yuv", "t.yuv", "u.yuv"};  // the pictures that films are made of
+constexpr int kNothing = -1;                                 // the place of what a segment lacks
 
 // What is read side by side: two inputs at most, and captions, which nothing is made of.
 struct Kind {
@@ -47,14 +50,16 @@ constexpr Kind kKinds[] = {{0, kNothing, ""}, {0, 3, ""},        {1, 1, ""},    
 struct Segment {
     Kind kind{kNothing, kNothing, ""};
     Number from = 0, to = 0;  // frames, or hundredths of a second where there is no picture
-    std::string word() const;
+    std::string word(bool films) const;
 };
 
-std::string Segment::word() const {
+std::string Segment::word(bool films) const {
     const std::string range = "@" + std::to_string(from / 100) + "." +
                               std::to_string(from % 100 + 100).substr(1) + "-" + std::to_string(to / 100) +
                               "." + std::to_string(to % 100 + 100).substr(1);
-    const auto name = [](int input) { return std::string(kInputs[input].name); };
+    const auto name = [films](int input) {
+        return std::string(films ? kInputs[input].film : kInputs[input].name);
+    };
     if (kind.picture == kNothing) return name(kind.sound) + range;
     const bool other = kind.sound != kNothing && kind.sound != kind.picture;
     return name(kind.picture) + (other ? "+" + name(kind.sound) : "") + kind.extra + "@" +
@@ -125,7 +130,7 @@ void Model::addSoundTo(Number end, const Segment& segment, Number first, Number 
         samples.push_back(from == kNothing || (plain && n >= most) ? Unit{} : Unit{from, plain ? n : kAny});
 }
 
-class JoinModel : public Tool {
+class JoinModel : public Tool, public testing::WithParamInterface<bool> {
   protected:
     void SetUp() override {
         Tool::SetUp();
@@ -145,20 +150,58 @@ class JoinModel : public Tool {
         }
         works({"transcode", kInputs[1].name, "-o", "tone.wav", "--no-video"});
         tone_ = wavPart(contents("tone.wav"), "data");
+        if (GetParam()) makeFilms();
     }
 
+    // Pictures in groups with frames that are predicted from later ones, sound in packets of several lengths.
+    void makeFilms() {
+        if (!std::filesystem::exists("/usr/bin/ffmpeg")) GTEST_SKIP() << "there is no ffmpeg here";
+        const Words h264{"-c:v", "libx264", "-qp", "0", "-bf", "3", "-g", "12"};
+        for (int input = 0; input < 3; ++input) {
+            const std::string side = std::to_string(kInputs[input].side);
+            const Fraction& rate = kInputs[input].rate;
+            if (input > 0)
+                works({"transcode", kInputs[input].name, "-o", kRaw[input], "--no-audio", "--pixel", "I420"});
+            Words made{"-f",       "rawvideo",
+                       "-pix_fmt", "yuv420p",
+                       "-s",       side + "x" + side,
+                       "-r",       std::to_string(rate.num) + "/" + std::to_string(rate.den),
+                       "-i",       kRaw[input]};
+            if (input == 1) made = made + Words{"-i", "tone.wav", "-c:a", "pcm_s16le"};
+            film(made + (input == 2 ? Words{"-c:v", "ffv1"} : h264), input);
+        }
+        film({"-i", "s44.wav"}, 3);
+        film({"-i", "s48.wav", "-c:a", "alac"}, 4);
+    }
+    void film(const Words& options, int input) const {
+        ProcessOptions where;
+        where.folder = folder.path().string();
+        const Outcome made = runProgram(
+            Words{"/usr/bin/ffmpeg", "-nostdin", "-v", "error"} + options + Words{kInputs[input].film},
+            where);
+        EXPECT_EQ(made.status, 0) << made.err;
+    }
+
+    // How the raw pictures among these words are read.
     static Words rawOf(const Words& words) {
         for (const std::string& word : words)
-            if (word.starts_with("p.yuv")) return {"--raw", "size=32x32,pixel=I420,rate=30000/1001"};
+            for (int input = 0; input < 3; ++input)
+                if (word.starts_with(kRaw[input])) {
+                    const std::string side = std::to_string(kInputs[input].side);
+                    const Fraction& rate = kInputs[input].rate;
+                    return {"--raw", "size=" + side + "x" + side + ",pixel=I420,rate=" +
+                                         std::to_string(rate.num) + "/" + std::to_string(rate.den)};
+                }
         return {};
     }
 
-    // The frames of an input at a size, converted one by one.
+    // The frames of an input at a size, converted one by one; of a film, those that it was made of.
     const std::map<std::string, Unit>& known(int input, int side) {
         auto& found = known_[{input, side}];
         if (!found.empty()) return found;
         const std::string size = std::to_string(side) + "x" + std::to_string(side);
-        const Words job{"transcode", kInputs[input].name, "-o", "known.yuv", "-y", "--no-audio"};
+        const char* const name = GetParam() ? kRaw[input] : kInputs[input].name;
+        const Words job{"transcode", name, "-o", "known.yuv", "-y", "--no-audio"};
         works(job + Words{"--pixel", "I420", "--size", size} + rawOf(job));
         const std::string bytes = contents("known.yuv");
         const auto frame = static_cast<size_t>(side) * static_cast<size_t>(side) * 3 / 2;
@@ -298,7 +341,7 @@ Model randomFormat(std::mt19937& random, const std::vector<Segment>& segments, W
     return model;
 }
 
-TEST_F(JoinModel, RandomJoinsAreAsTheModelSays) {
+TEST_P(JoinModel, RandomJoinsAreAsTheModelSays) {
     constexpr unsigned usual = *QV_SANITIZE ? 8 : 50;  // a sanitizer takes ten times as long
     const unsigned seed = fromEnvironment("QV_SEED", 20261), rounds = fromEnvironment("QV_JOINS", usual);
     for (unsigned round = 0; round < rounds && !HasFailure(); ++round) {
@@ -308,7 +351,7 @@ TEST_F(JoinModel, RandomJoinsAreAsTheModelSays) {
         const unsigned count = 2 + static_cast<unsigned>(random() % 4);
         while (segments.size() < count) segments.push_back(randomSegment(random, sound));
         Words job{"transcode", "--join", "-y", "--save-task", "job.xml"};
-        for (const Segment& segment : segments) job.push_back(segment.word());
+        for (const Segment& segment : segments) job.push_back(segment.word(GetParam()));
         Model model = randomFormat(random, segments, job);
         for (const Segment& segment : segments) model.add(segment);
         job = job + rawOf(job) + Words{"-o", model.side > 0 ? "o.yuv" : "o.wav"};
@@ -318,5 +361,7 @@ TEST_F(JoinModel, RandomJoinsAreAsTheModelSays) {
         if (!HasFailure()) expectSameFromTask(random);
     }
 }
+INSTANTIATE_TEST_SUITE_P(OfInputs, JoinModel, testing::Bool(),
+                         [](const auto& param) { return param.param ? "films" : "ownForms"; });
 
 }  // namespace
