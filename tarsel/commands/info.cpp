@@ -32,6 +32,20 @@ void describeText(const AnyDict& p, Json& stream) {
     stream["last_s"] = end.asMediaTime().seconds();
 }
 
+// The usual name of speakers, or their bits as WAVEFORMATEXTENSIBLE has them.
+std::string speakersOf(long long mask) {
+    static constexpr struct {
+        long long mask;
+        const char* name;
+    } kKnown[] = {{0x4, "mono"},  {0x3, "stereo"}, {0xb, "2.1"},   {0x7, "3.0"},  {0x33, "quad"},
+                  {0x607, "5.0"}, {0x37, "5.0"},   {0x60f, "5.1"}, {0x3f, "5.1"}, {0x63f, "7.1"}};
+    for (const auto& known : kKnown)
+        if (known.mask == mask) return known.name;
+    char text[32];
+    std::snprintf(text, sizeof text, "mask 0x%llx", mask);
+    return text;
+}
+
 Json describeStream(const QvDecodePipe& decoder, int type, int number) {
     AnyDict p;
     decoder.getStreamParams(type, number, p);
@@ -185,11 +199,7 @@ std::string streamLine(const Json& s) {
         if (s.contains("channels")) add(number("channels") + " ch");
         if (s.contains("bits")) add(number("bits") + " bit");
         if (s.contains("source_format")) add("from " + s["source_format"].get<std::string>());
-        if (s.contains("channel_mask")) {
-            char mask[32];
-            std::snprintf(mask, sizeof mask, "mask 0x%llx", s["channel_mask"].get<long long>());
-            add(mask);
-        }
+        if (s.contains("channel_mask")) add(speakersOf(s["channel_mask"].get<long long>()));
         if (s.contains("samples")) add(number("samples") + " samples");
     }
     if (s.contains("bit_rate")) add(std::to_string(s["bit_rate"].get<long long>() / 1000) + " kbit/s");

@@ -227,12 +227,15 @@ std::string planText(const JobPlan& plan) {
         for (const std::string& filter : stream.chain) text += "filter  " + filter + "\n";
         text += std::string("encoder ") + stream.encoder() + ": " + formatOf(stream) +
                 (stream.set.empty() ? "" : ", " + stream.set) + "\n";
-        text += "expect  " + std::to_string(stream.expected) + " " + stream.unit() + ", " +
-                std::to_string(stream.bytes(stream.expected)) + " bytes\n";
+        text += "expect  " + std::to_string(stream.expected) + " " + stream.unit();
+        if (stream.isRaw()) text += ", " + std::to_string(stream.bytes(stream.expected)) + " bytes";
+        text += "\n";
     }
     if (plan.preset && !plan.preset->reason().empty())
         text += "preset  " + inQuotes(plan.preset->name()) + ", " + plan.preset->reason() + "\n";
     const bool nowhere = plan.output.place == OutputPlace::nowhere;
-    return text + "output  " + (nowhere ? "nothing" : inQuotes(plan.output.name)) + " by " +
-           plan.output.muxer() + ", " + formatBytes(plan.bytes()) + "\n";
+    text += "output  " + (nowhere ? "nothing" : inQuotes(plan.output.name)) + " by " + plan.output.muxer();
+    // How long an encoder's results will be is not known.
+    if (std::ranges::all_of(plan.streams, &PlannedStream::isRaw)) text += ", " + formatBytes(plan.bytes());
+    return text + "\n";
 }
