@@ -103,6 +103,8 @@ PictureFormat pictureFormat(const Source& source, int stream) {
     format.aspect = aspect.isDouble() && aspect.asDouble() > 0
                         ? aspect.asDouble()
                         : static_cast<double>(format.width) / std::max(format.height, 1);
+    format.colours = {intParam(decoder, stream, "colourPrimaries"),
+                      intParam(decoder, stream, "colourTransfer"), intParam(decoder, stream, "colourSpace")};
     return format;
 }
 

@@ -11,11 +11,18 @@
 #include "tarsel/picture/effects.h"
 #include "tarsel/source/source.h"
 
+// How a film's numbers stand for colours: code points of ITU-T H.273, 0 where it does not say.
+struct Colours {
+    int primaries = 0, transfer = 0, space = 0;
+    bool stated() const { return primaries > 0 || transfer > 0 || space > 0; }
+};
+
 struct PictureFormat {
     int width = 0, height = 0;
     unsigned fourcc = 0;
     QvFramerate rate{QvRatio(25, 1)};
     double aspect = 0;  // of the picture when it is shown
+    Colours colours{};  // of what is read
     // Width to height of a pixel; 1 for anything near to it or beyond use.
     double pixelAspect() const;
 };

@@ -119,6 +119,8 @@ constexpr Message kMessages[] = {
     {Msg::fitFar,                 Exit::usage,  "--fit",                            "{name} is too far from the shape of the picture",              "give a box that is more like it"},
     {Msg::matrixWrong,            Exit::usage,  "--matrix",                         "{name} is not 601, 709, or IN:OUT of these",                   "use 601, 709 or 601:709"},
     {Msg::matrixNoYuv,            Exit::usage,  "--matrix",                         "neither the input nor the output is YUV",                      "leave it out, or choose a YUV format with --pixel"},
+    {Msg::coloursLost,            Exit::done,   "the colours of {file} are lost",   "wide gamut or high dynamic range, which this output does not keep", "write YUV of 720 lines or more, without --matrix"},
+    {Msg::coloursDiffer,          Exit::done,   "the colours of {file} will look wrong", "of wide gamut and usual colours one is not converted to the other", "join films of one kind"},
     {Msg::cropWrong,              Exit::usage,  "{option}",                         "{name} is not a part of a picture",                            "use WxH, WxH+X+Y or W:H"},
     {Msg::cropEmpty,              Exit::usage,  "--crop",                           "{name} leaves less than 4x4 pixels",                           "give a larger part"},
     {Msg::cropBeyond,             Exit::usage,  "--crop",                           "{name} is beyond the picture, which is {text}",                "give a part of it"},

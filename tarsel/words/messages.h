@@ -119,6 +119,8 @@ enum class Msg : unsigned short {
     fitFar,
     matrixWrong,
     matrixNoYuv,
+    coloursLost,
+    coloursDiffer,
     cropWrong,
     cropEmpty,
     cropBeyond,

@@ -13,11 +13,15 @@
 //     "rotation"          Int32     degrees clockwise to be shown upright: 90, 180 or 270; absent for 0
 //     "mirrored"          Int32     1: it is to be shown mirrored
 //     "colourMatrix"      Int32     QvYUVMatrix, where the film states one of these
+//     "colourPrimaries", "colourTransfer", "colourSpace"
+//                         Int32     code points of ITU-T H.273 (2020 non-constant is 9), where stated
 //     "variableRate"      Int32     1: "framerate" is the nearest usual rate, and frames repeat or skip
 //                                   pictures
 //     "conversion"        String    what the pixel format can't hold, or how the frames are made of the
-//     pictures "concealed"         Int64     pictures so far that were damaged or did not come "codecProfile"
-//     String    of the codec: "High", "Main 10" "language", "title" String    where the container has them
+//                                   pictures
+//     "concealed"         Int64     pictures so far that were damaged or did not come
+//     "codecProfile"      String    of the codec: "High", "Main 10"
+//     "language", "title" String    where the container has them
 //     "codecParams"       Dict      "pid", where the container numbers its streams
 //
 // A stream of sound has "codecProfile", "language", "title", "channelMask" (Int64), "conversion" (why it ends

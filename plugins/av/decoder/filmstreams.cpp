@@ -49,6 +49,9 @@ PictureStream::PictureStream(std::unique_ptr<FrameReader> reader, const AVStream
     if (format.rotation != 0) params.set("rotation", format.rotation);
     if (format.mirrored) params.set("mirrored", 1);
     if (format.colourMatrix != 0) params.set("colourMatrix", format.colourMatrix);
+    if (format.primaries != 0) params.set("colourPrimaries", format.primaries);
+    if (format.transfer != 0) params.set("colourTransfer", format.transfer);
+    if (format.space != 0) params.set("colourSpace", format.space);
     if (format.variable) params.set("variableRate", 1);
     if (!format.lost.empty()) params.set("conversion", Any(format.lost.c_str()));
     describeStream(stream, params);

@@ -164,6 +164,9 @@ std::string VideoEnc::configure(AVPixelFormat layout) {
     c.color_primaries = hd ? AVCOL_PRI_BT709 : film ? AVCOL_PRI_SMPTE170M : AVCOL_PRI_BT470BG;
     c.color_trc = hd ? AVCOL_TRC_BT709 : AVCOL_TRC_SMPTE170M;
     c.colorspace = hd ? AVCOL_SPC_BT709 : film ? AVCOL_SPC_SMPTE170M : AVCOL_SPC_BT470BG;
+    if (s.primaries > 0) c.color_primaries = static_cast<AVColorPrimaries>(s.primaries);
+    if (s.transfer > 0) c.color_trc = static_cast<AVColorTransferCharacteristic>(s.transfer);
+    if (s.space > 0) c.colorspace = static_cast<AVColorSpace>(s.space);
     if ((av_pix_fmt_desc_get(layout)->flags & AV_PIX_FMT_FLAG_RGB) != 0) {
         c.colorspace = AVCOL_SPC_RGB;
         c.color_range = AVCOL_RANGE_JPEG;

@@ -291,6 +291,9 @@ void FrameReader::Decoding::describe(PictureFormat& format) {
     if (aspect.num > 0 && aspect.den > 0) format.pixelAspect = av_q2d(aspect);
     format.fieldOrder = fieldOrderOf(first);
     format.colourMatrix = matrixOf(first);
+    format.primaries = codePoint(first.color_primaries);
+    format.transfer = codePoint(first.color_trc);
+    format.space = codePoint(first.colorspace);
     const Turn turn = turnOf(stream);
     format.rotation = turn.clockwise;
     format.mirrored = turn.mirrored;

@@ -25,9 +25,10 @@ struct PictureFormat {
     bool variable = false;  // the times in the file are not those of a constant rate
     int frames = 0;         // exact
     double pixelAspect = 1;
-    int fieldOrder = 0;    // the engine's value
-    int colourMatrix = 0;  // the engine's value
-    int rotation = 0;      // 0, 90, 180, 270 degrees clockwise to be shown upright
+    int fieldOrder = 0;                          // the engine's value
+    int colourMatrix = 0;                        // the engine's value
+    int primaries = 0, transfer = 0, space = 0;  // code points of ITU-T H.273; 0: not stated
+    int rotation = 0;                            // 0, 90, 180, 270 degrees clockwise to be shown upright
     bool mirrored = false;
     std::string codec;   // as people know it: "H.264", "MPEG-2"
     std::string lost;    // what the form can't hold, one line; "" for nothing

@@ -63,6 +63,11 @@ int matrixOf(const AVFrame& picture) {
     }
 }
 
+int codePoint(int value) {
+    constexpr int unspecified = 2;
+    return value > 0 && value < 256 && value != unspecified ? value : 0;
+}
+
 Turn turnOf(const AVStream& stream) {
     std::size_t bytes = 0;
     const auto* data = reinterpret_cast<const std::int32_t*>(

@@ -10,6 +10,7 @@ namespace av {
 std::string codecName(AVCodecID codec);    // as people know it: "H.264", "MPEG-2"
 int fieldOrderOf(const AVFrame& picture);  // 0 progressive, 1 top field first, 2 bottom field first
 int matrixOf(const AVFrame& picture);      // QvYUVMatrix
+int codePoint(int value);                  // of ITU-T H.273; 0 for what is reserved or not stated
 struct Turn {
     int clockwise = 0;  // degrees to be shown upright: 0, 90, 180, 270
     bool mirrored = false;

@@ -3,6 +3,7 @@
 #include <string_view>
 #include <utility>
 
+#include "tarsel/job/plan/colours.h"
 #include "tarsel/presets/ranges.h"
 #include "tarsel/source/source.h"
 #include "tarsel/words/messages.h"
@@ -117,6 +118,32 @@ void PresetPlanner::takeSound(PlannedStream& stream, const QvCodec& encoder) con
     if (!options_.bits && asked.bits) sound.bits = *asked.bits;
 }
 
+// The encoder is told once, for the first segment of a join.
+void PresetPlanner::setColours(const PlannedStream& stream, QvCodec& encoder) const {
+    const PictureFormat& in = plan_.source(stream).picture;
+    const std::string& name = plan_.input(stream).name;
+    if (known_ && static_cast<size_t>(stream.number) < known_->pictures.size()) {
+        if (isWide(in.colours) != isWide(known_->pictures[static_cast<size_t>(stream.number)].colours))
+            plan_.warnings.push_back(lineOf(Msg::coloursDiffer, {name}));
+        return;
+    }
+    PictureFormat out = stream.picture;
+    try {
+        const Any taken = encoder.getParam("selectedFOURCC");
+        if (taken.isInt()) out.fourcc = static_cast<unsigned>(taken.asInt32(0));
+        const bool resized = out.width != in.width || out.height != in.height || out.fourcc != in.fourcc;
+        const bool converted = resized || !stream.chain.empty();
+        const Colours colours = effects_.matrix.empty() ? coloursOf(in, out, converted) : Colours{};
+        if (isWide(in.colours) && !isWide(colours))
+            plan_.warnings.push_back(lineOf(Msg::coloursLost, {name}));
+        for (const auto& [key, value] :
+             {std::pair{"colourPrimaries", colours.primaries}, std::pair{"colourTransfer", colours.transfer},
+              std::pair{"colourSpace", colours.space}})
+            encoder.setParam(key, value);
+    } catch (const QvParamException&) {  // it has no such parameters
+    }
+}
+
 void PresetPlanner::settle() {
     if (!pipe_) return;
     for (PlannedStream& stream : plan_.streams) {
@@ -129,6 +156,7 @@ void PresetPlanner::settle() {
             checkSoundRanges(preset, encoder, stream.sound.samplerate, stream.sound.channels,
                              stream.sound.bits);
         setFormat(encoder, stream);
+        if (stream.isVideo()) setColours(stream, encoder);
         encoder.store(stream.codec);
     }
 }

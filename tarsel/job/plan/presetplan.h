@@ -24,6 +24,7 @@ class PresetPlanner {
   private:
     void takeEncoder(PlannedStream& stream);
     PictureFormat wanted(const PlannedStream& stream, const QvCodec& encoder, bool& asks) const;
+    void setColours(const PlannedStream& stream, QvCodec& encoder) const;
     void takeSound(PlannedStream& stream, const QvCodec& encoder) const;
 
     JobPlan& plan_;

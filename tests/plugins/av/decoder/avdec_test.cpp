@@ -161,4 +161,42 @@ TEST_F(FilmsInTheTool, keepTheirFieldsAndAspect) {
     EXPECT_THAT(o.out, HasSubstr("\"frame_aspect\": 1.333"));
 }
 
+// The numbers of the pictures stay, so what they stand for has to stay with them.
+TEST_F(FilmsInTheTool, keepTheirColours) {
+    const std::string large = "testsrc2=size=1280x720:rate=25:duration=0.2", small = kMoving;
+    const Words pq{"-c:v",   "libx264",    "-pix_fmt",  "yuv420p10le", "-color_primaries",
+                   "bt2020", "-color_trc", "smpte2084", "-colorspace", "bt2020nc"};
+    const Words hd{"-c:v",  "libx264",    "-pix_fmt", "yuv420p",     "-color_primaries",
+                   "bt709", "-color_trc", "bt709",    "-colorspace", "bt709"};
+    const struct {
+        const Words& made;
+        const std::string& source;
+        Words options;
+        const char* colours;
+        bool warns;
+    } rows[] = {
+        {pq, large, {"-o", "o.mp4"}, "bt2020nc,smpte2084,bt2020", false},
+        {pq, large, {"-o", "o.mkv", "--vcodec", "prores"}, "bt2020nc,smpte2084,bt2020", false},
+        {pq, large, {"-o", "o.mp4", "--size", "1920x1080"}, "bt2020nc,smpte2084,bt2020", false},
+        {pq, large, {"-o", "o.mp4", "--size", "640x360"}, "bt470bg,smpte170m,bt470bg", true},
+        {pq, large, {"-o", "o.mp4", "--matrix", "709"}, "bt709,bt709,bt709", true},
+        {hd, small, {"-o", "o.mp4"}, "bt709,bt709,bt709", false},
+        {hd, small, {"-o", "o.mp4", "--size", "64x48"}, "bt470bg,smpte170m,bt470bg", false},
+    };
+    for (const auto& row : rows) {
+        SCOPED_TRACE(testing::PrintToString(row.options));
+        film("film.mkv", row.made, row.source);
+        Words job{"transcode", "film.mkv", "-y"};
+        job.insert(job.end(), row.options.begin(), row.options.end());
+        const Outcome o = tarsel(job);
+        EXPECT_EQ(o.status, 0) << o.err;
+        EXPECT_EQ(o.err.find("the colours of 'film.mkv' are lost") != std::string::npos, row.warns) << o.err;
+        const Outcome probed =
+            runProgram({"/usr/bin/env", "ffprobe", "-v", "error", "-select_streams", "v", "-show_entries",
+                        "stream=color_space,color_transfer,color_primaries", "-of", "csv=p=0",
+                        folder.file(row.options.at(1))});
+        EXPECT_THAT(probed.out, HasSubstr(row.colours));
+    }
+}
+
 }  // namespace
