@@ -302,6 +302,11 @@ TEST(VideoEncoders, RefuseWhatTheyCanNotDo) {
                  {"avOptions", "no equals sign"},
                  {"avOptions", "stats=/tmp/x"},
                  {"avOptions", "x264-params=dump-yuv=/tmp/x"},
+                 {"avOptions", "x264-params=pass=1"},
+                 {"avOptions", "flags=+pass1"},
+                 {"avOptions", "threads=9"},
+                 {"avOptions", "time_base=1/9"},
+                 {"avOptions", "colorspace=rgb"},
                  {"meta", "text"}};
     for (const auto& row : wrong) EXPECT_NE(encoder->setParam(row.name, row.value), 0) << row.name;
     EXPECT_NE(encoder->setParam("avOptions", "aq-mod=1"), 0);
@@ -407,7 +412,8 @@ TEST(SoundEncoders, RefuseWhatTheyCanNotDo) {
     EXPECT_NE(encoder->setParam("channels", 9), 0);
     EXPECT_NE(encoder->setParam("bitsPerSample", 20), 0);
     EXPECT_NE(encoder->setParam("bitrate", QvBitrate(QvBitrate::cbr, 129000)), 0);
-    EXPECT_NE(encoder->setParam("avOptions", "bogus=1"), 0);
+    for (const char* options : {"bogus=1", "ar=8000", "ac=1", "ch_layout=mono", "threads=9"})
+        EXPECT_NE(encoder->setParam("avOptions", options), 0) << options;
     EXPECT_EQ(av::newEncoder("nosuchenc"), nullptr);
 }
 
