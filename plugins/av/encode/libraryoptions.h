@@ -8,9 +8,12 @@
 namespace av {
 
 // Sets them one after the other. "" if all were taken, otherwise why one was not, with near names. Names of
-// files are refused: a task that somebody sends must not write any.
+// files are refused: a task that somebody sends must not write any. Refused, too, is what the encoder's
+// parameters decide, as rates, channels, threads and passes: buffers are made for these.
 std::string setOptions(AVCodecContext& context, const std::string& options);
-// The same on a context of its own.
+// Adds "name=value:name=value" to what the option `name` has already. False without memory.
+bool addParameters(AVCodecContext& context, const char* name, const std::string& parameters);
+// setOptions on a context of its own.
 std::string checkOptions(const AVCodec& codec, const std::string& options);
 
 }  // namespace av

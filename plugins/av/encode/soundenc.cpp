@@ -2,11 +2,13 @@
 
 #include <algorithm>
 #include <array>
+#include <cstdlib>
 #include <cstring>
 
 #include "core/engine/qvutil.h"
 #include "core/media/qvpcm.h"
 #include "plugins/av/encode/libraryoptions.h"
+#include "plugins/av/source/soundlayout.h"
 
 namespace av {
 
@@ -29,18 +31,26 @@ constexpr int layer2Bits[] = {32, 48, 56, 64, 80, 96, 112, 128, 160, 192, 224, 2
 constexpr int layer3Bits[] = {32, 40, 48, 56, 64, 80, 96, 112, 128, 160, 192, 224, 256, 320};
 constexpr int dolbyBits[] = {32, 64, 96, 128, 160, 192, 224, 256, 320, 384, 448, 512, 576, 640};
 constexpr int opusBits[] = {16, 24, 32, 48, 64, 96, 128, 160, 192, 256, 320, 384, 448, 510};
+static_assert(opusBits[9] == 256);
+
+// Layer 2 and 3 of MPEG-2, and of MPEG-2.5 in part.
+constexpr int slowBits[] = {8, 16, 24, 32, 40, 48, 56, 64, 80, 96, 112, 128, 144, 160};
+constexpr int upTo2[] = {1, 2};
+constexpr int upTo6[] = {1, 2, 3, 4, 5, 6};
+constexpr int upTo8[] = {1, 2, 3, 4, 5, 6, 7, 8};
+constexpr int aacChannels[] = {1, 2, 3, 4, 5, 6, 8};  // ADTS has no word for seven
 
 // clang-format off
 constexpr auto codecs = std::to_array<SoundCodec>({
-    {"aacaenc",       "aac",        "AAC ", "aac",  aacRates,   aacBits,    8, 160, false},
-    {"mpegaenc",      "mp2",        "MP2 ", "mp2",  mpegRates,  layer2Bits, 2, 224, false},
-    {"mpegpcmenc",    "",           "PCM ", "pcm",  anyRates,   {},         8, 0,   true},
-    {"mp3aenc",       "libmp3lame", "MP3 ", "mp3",  mp3Rates,   layer3Bits, 2, 192, false},
-    {"ddaenc",        "ac3",        "AC-3", "ac3",  dolbyRates, dolbyBits,  6, 192, false},
-    {"ddproaenc",     "ac3",        "AC-3", "ac3",  dolbyRates, dolbyBits,  6, 384, false},
-    {"ddplusproaenc", "eac3",       "EC-3", "eac3", dolbyRates, dolbyBits,  6, 384, false},
-    {"flacaenc",      "flac",       "FLAC", "flac", anyRates,   {},         8, 0,   true},
-    {"opusaenc",      "libopus",    "OPUS", "opus", opusRates,  opusBits,   8, 128, false},
+    {"aacaenc",       "aac",        "AAC ", "aac",  aacRates,   aacBits,    aacChannels, 160},
+    {"mpegaenc",      "mp2",        "MP2 ", "mp2",  mpegRates,  layer2Bits, upTo2, 224, slowBits},
+    {"mpegpcmenc",    "",           "PCM ", "pcm",  anyRates,   {},         upTo8, 0},
+    {"mp3aenc",       "libmp3lame", "MP3 ", "mp3",  mp3Rates,   layer3Bits, upTo2, 192, slowBits},
+    {"ddaenc",        "ac3",        "AC-3", "ac3",  dolbyRates, dolbyBits,  upTo6, 192},
+    {"ddproaenc",     "ac3",        "AC-3", "ac3",  dolbyRates, dolbyBits,  upTo6, 384},
+    {"ddplusproaenc", "eac3",       "EC-3", "eac3", dolbyRates, dolbyBits,  upTo6, 384},
+    {"flacaenc",      "flac",       "FLAC", "flac", anyRates,   {},         upTo8, 0},
+    {"opusaenc",      "libopus",    "OPUS", "opus", opusRates,  opusBits,   upTo8, 128},
 });
 // clang-format on
 
@@ -54,15 +64,31 @@ bool holds(std::span<const int> values, int value) {
     return std::find(values.begin(), values.end(), value) != values.end();
 }
 
+bool is(C s, const char* module) { return std::strcmp(s.codec->module, module) == 0; }
+
+constexpr int leastFastRate = 32000;  // of MPEG-1
+
+// Those that fit the rate and the channels.
+std::span<const int> kilobitsOf(C s) {
+    const auto all = s.codec->kilobits;
+    if (s.samplerate < leastFastRate && !s.codec->lowKilobits.empty()) return s.codec->lowKilobits;
+    if (is(s, "opusaenc") && s.channels == 1) return all.first(10);                      // 256 a channel
+    if (s.codec->kilobits.data() == dolbyBits && s.channels > 2) return all.subspan(1);  // 32 are too few
+    return all;
+}
+
 double bitsPerSecond(C s) {
-    if (!s.codec->kilobits.empty()) return s.kilobits * 1000.0;
+    const auto all = kilobitsOf(s);
+    if (!all.empty())
+        return 1000.0 * *std::min_element(all.begin(), all.end(), [&s](int a, int b) {
+                   return std::abs(a - s.kilobits) < std::abs(b - s.kilobits);
+               });
     return 1.0 * s.samplerate * s.channels * s.bits;
 }
 
 int setKilobits(S& s, double wanted) {
-    const int nearest = static_cast<int>(wanted);
-    if (!(wanted > 0) || !holds(s.codec->kilobits, nearest) || nearest != wanted)
-        return QvStatus::invalidParam;
+    const int nearest = wanted > 0 && wanted < 1e6 ? static_cast<int>(wanted) : 0;
+    if (!holds(kilobitsOf(s), nearest) || nearest != wanted) return QvStatus::invalidParam;
     s.kilobits = nearest;
     return QvStatus::ok;
 }
@@ -86,8 +112,7 @@ int setRate(S& s, const Any& value) {
 
 int setChannels(S& s, const Any& value) {
     int wanted = 0;
-    if (!qvparam::convert(value, wanted) || wanted < 1 || wanted > s.codec->mostChannels)
-        return QvStatus::invalidParam;
+    if (!qvparam::convert(value, wanted) || !holds(s.codec->channels, wanted)) return QvStatus::invalidParam;
     s.channels = wanted;
     return QvStatus::ok;
 }
@@ -111,15 +136,9 @@ int setOptionText(S& s, const Any& value) {
 void bitrateRange(C s, Any& value) {
     AnyDict row("type", static_cast<int>(QvBitrate::cbr));
     row.set("range", s.codec->kilobits.empty() ? AnyVector(static_cast<int>(bitsPerSecond(s)))
-                                               : vectorOf(s.codec->kilobits, 1000));
+                                               : vectorOf(kilobitsOf(s), 1000));
     AnyVector all;
     all.append(row);
-    value = all;
-}
-
-void channelsRange(C s, Any& value) {
-    AnyVector all;
-    for (int count = 1; count <= s.codec->mostChannels; ++count) all.append(count);
     value = all;
 }
 
@@ -158,10 +177,10 @@ const QvParamRow<S> table[] = {
     {"type", {}, qvParamIgnored},
     {"pal", {}, qvParamIgnored},
     {"samplerateRange", Access{nullptr, [](C s, Any& v) { v = vectorOf(s.codec->rates); }}},
-    {"channelsRange", Access{nullptr, channelsRange}},
+    {"channelsRange", Access{nullptr, [](C s, Any& v) { v = vectorOf(s.codec->channels); }}},
     {"bitsPerSampleRange", Access{nullptr, [](C, Any& v) { v = AnyVector(16, 24); }}},
     {"bitrateRange", Access{nullptr, bitrateRange}},
-    {"aBitrateRange", Access{nullptr, [](C s, Any& v) { v = vectorOf(s.codec->kilobits); }}},
+    {"aBitrateRange", Access{nullptr, [](C s, Any& v) { v = vectorOf(kilobitsOf(s)); }}},
     {"estimateSecKb",
      Access{nullptr, [](C s, Any& v) { v = Any(static_cast<float>(bitsPerSecond(s) / 8000)); }}},
     {"extension", Access{nullptr, [](C s, Any& v) { v = s.codec->extension; }}},
@@ -214,6 +233,16 @@ AVSampleFormat formatOf(const AVCodec& library, int bits) {
     return finest;
 }
 
+// ADTS has a number for each layout, so four channels of AAC are three in front and one behind. Opus places
+// more than two channels right only in the family of Vorbis.
+bool setLayout(AVCodecContext& context, C s) {
+    if (is(s, "aacaenc") && s.channels == 4)
+        return av_channel_layout_from_mask(&context.ch_layout, AV_CH_LAYOUT_4POINT0) >= 0;
+    if (is(s, "opusaenc") && s.channels > 2 && av_opt_set_int(context.priv_data, "mapping_family", 1, 0) < 0)
+        return false;
+    return setUsualLayout(context.ch_layout, s.channels);
+}
+
 constexpr int adtsRates[] = {96000, 88200, 64000, 48000, 44100, 32000,
                              24000, 22050, 16000, 12000, 11025, 8000};
 
@@ -249,6 +278,12 @@ int SoundEnc::setParam(const char* name, const Any& value) {
     if (std::strcmp(name, "settings") == 0) {
         _traceParam(name, value);
         return value.isDict() ? setParamDict(value.asDict()) : QvStatus::invalidParam;
+    }
+    if (std::strcmp(name, "avOptions") == 0 && value.isText()) {
+        const AVCodec* const library = settings_.codec->library();
+        const std::string why = library ? checkOptions(*library, value.toString().asString(""))
+                                        : "this encoder has no options of a library";
+        if (!why.empty()) return setError(QvStatus::invalidParam, "avOptions: %s", why.c_str());
     }
     if (auto result = _setRow<SoundSettings>(SoundSettings::rows(), settings_, name, value)) return *result;
     return QvAudioEncoder::setParam(name, value);
@@ -286,9 +321,9 @@ std::string SoundEnc::prepare() {
     AVCodecContext& c = *context_;
     c.sample_rate = s.samplerate;
     c.sample_fmt = formatOf(*library, s.bits);
-    av_channel_layout_default(&c.ch_layout, s.channels);
+    if (!setLayout(c, s)) return "Out of memory";
     c.time_base = {1, s.samplerate};
-    c.bit_rate = s.codec->kilobits.empty() ? 0 : std::int64_t{s.kilobits} * 1000;
+    c.bit_rate = s.codec->kilobits.empty() ? 0 : static_cast<std::int64_t>(bitsPerSecond(s));
     c.bits_per_raw_sample = s.bits;
     c.thread_count = s.threads;
     if (const std::string why = setOptions(c, s.options); !why.empty()) return why;
@@ -421,16 +456,15 @@ int SoundEnc::putPacket() {
     const auto* changed = av_packet_get_side_data(packet_.get(), AV_PKT_DATA_NEW_EXTRADATA, &bytes);
     if (changed && static_cast<int>(bytes) == c.extradata_size) std::memcpy(c.extradata, changed, bytes);
     if (packet_->size == 0) return QvStatus::ok;
-    const int count = c.frame_size > 0 && std::strcmp(settings_.codec->module, "flacaenc") != 0
-                          ? c.frame_size
-                          : static_cast<int>(packet_->duration);
+    const int count =
+        c.frame_size > 0 && !is(settings_, "flacaenc") ? c.frame_size : static_cast<int>(packet_->duration);
     QvWire::AudioUnit unit{};
     unit.samples = static_cast<std::uint32_t>(count) | QvWire::unitTimed;
     unit.pts = sent_ - c.initial_padding;
     sent_ += count;
     std::array<std::uint8_t, 7> adts;
     std::span<const std::uint8_t> prefix;
-    if (std::strcmp(settings_.codec->module, "aacaenc") == 0) {
+    if (is(settings_, "aacaenc")) {
         adts = adtsHeader(settings_.samplerate, settings_.channels, packet_->size);
         prefix = adts;
     }

@@ -23,8 +23,9 @@ struct SoundCodec {
     const char* fourcc;
     const char* extension;
     std::span<const int> rates, kilobits;  // without bit rates: the size follows from the sound
-    int mostChannels, usualKilobits;
-    bool deep;  // takes 24 bits as they are
+    std::span<const int> channels;
+    int usualKilobits;
+    std::span<const int> lowKilobits = {};  // of rates below those of MPEG-1, where these are others
     const AVCodec* library() const { return avcodec_find_encoder_by_name(encoder); }
 };
 const SoundCodec* soundCodec(const char* module);
@@ -33,7 +34,8 @@ struct SoundSettings {
     explicit SoundSettings(const SoundCodec& row) : codec(&row), kilobits(row.usualKilobits) {}
 
     const SoundCodec* codec;
-    int samplerate = 48000, channels = 2, bits = 16, kilobits, profile = -1, threads = 0;
+    int samplerate = 48000, channels = 2, bits = 16, profile = -1, threads = 0;
+    int kilobits;  // that are wanted; the nearest of those that the rate has is used
     std::string options;
 
     static std::span<const QvParamRow<SoundSettings>> rows();

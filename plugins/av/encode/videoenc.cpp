@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cmath>
 #include <cstring>
+#include <iterator>
 
 #include "core/arch/qvexception.h"
 #include "core/measure/fourcc.h"
@@ -22,12 +23,27 @@ std::span<const std::uint8_t> bytesOf(const AVPacket& packet) {
 
 bool is(const VideoCodec& codec, const char* module) { return std::strcmp(codec.module, module) == 0; }
 
-// The name of each kind of ProRes.
+struct ProresKind {
+    const char* fourcc;
+    unsigned tag;
+};
+// In the order of the profile numbers.
+constexpr ProresKind proresKinds[] = {{"APCO", qvFourcc("apco")}, {"APCS", qvFourcc("apcs")},
+                                      {"APCN", qvFourcc("apcn")}, {"APCH", qvFourcc("apch")},
+                                      {"AP4H", qvFourcc("ap4h")}, {"AP4X", qvFourcc("ap4x")}};
+
+// The library states the kind of ProRes by its tag alone.
+int profileOf(const AVCodecContext& context, const VideoCodec& codec) {
+    if (!is(codec, "proresvenc")) return context.profile;
+    const auto* const kind =
+        std::find_if(std::begin(proresKinds), std::end(proresKinds),
+                     [&](const ProresKind& row) { return row.tag == context.codec_tag; });
+    return kind != std::end(proresKinds) ? static_cast<int>(kind - std::begin(proresKinds)) : -1;
+}
+
 const char* fourccOf(const AVCodecContext& context, const VideoCodec& codec) {
-    constexpr const char* prores[] = {"APCO", "APCS", "APCN", "APCH", "AP4H", "AP4X"};
-    if (is(codec, "proresvenc") && context.profile >= 0 && context.profile < 6)
-        return prores[context.profile];
-    return codec.fourcc;
+    const int profile = profileOf(context, codec);
+    return is(codec, "proresvenc") && profile >= 0 ? proresKinds[profile].fourcc : codec.fourcc;
 }
 
 unsigned fourccNumber(const char* text) {
@@ -132,10 +148,10 @@ std::string VideoEnc::prepare() {
     std::string problem = configure(layout());
     if (problem.empty()) problem = describeCodec();
     if (problem.empty()) problem = configureRate();
+    if (problem.empty()) problem = setOptions(*context_, s.profileOptions);
+    if (problem.empty()) problem = setOptions(*context_, s.options);
     if (problem.empty()) problem = configurePass();
     if (!problem.empty()) return problem;
-    if (const std::string why = setOptions(*context_, s.profileOptions); !why.empty()) return why;
-    if (const std::string why = setOptions(*context_, s.options); !why.empty()) return why;
     const int opened = avcodec_open2(context_.get(), library, nullptr);
     if (opened < 0)
         return std::string("The encoder does not take these settings (") + codec.encoder + ": " +
@@ -253,8 +269,7 @@ std::string VideoEnc::configurePass() {
     } else if (s.firstPass) {
         return "There is no record for the statistics of a first pass";
     }
-    if (x265 && av_opt_set(&c, "x265-params", own.c_str(), AV_OPT_SEARCH_CHILDREN) < 0)
-        return "Out of memory";
+    if (x265 && !addParameters(c, "x265-params", own)) return "Out of memory";
     return "";
 }
 
@@ -277,7 +292,7 @@ bool VideoEnc::sendHead() {
     head.matrix = static_cast<std::uint16_t>(c.colorspace);
     head.fullRange = c.color_range == AVCOL_RANGE_JPEG ? 1 : 0;
     head.delay = c.has_b_frames > 0 ? c.has_b_frames : c.max_b_frames > 0 ? 1 : 0;
-    head.profile = c.profile;
+    head.profile = profileOf(c, *settings_.codec);
     head.level = c.level;
     head.extradata = c.extradata;
     head.extradataBytes = static_cast<std::uint64_t>(std::max(c.extradata_size, 0));

@@ -65,7 +65,7 @@ constexpr auto containers = std::to_array<Container>({
          lengths},
     {"mxf",          codecBits(mpeg2, h264, dnxhd, dv, jpeg2000, prores, pcm),      1, 16, PipeForm::same,
          title | timecode,
-         pixels | needsVideo, codecBit(h264)},
+         pixels | needsVideo | soundHeader, codecBit(h264)},
     {"mpegts",       codecBits(h264, hevc, mpeg1, mpeg2, mpeg4, aac, mp2, mp3, ac3, eac3, opus), 8, 32, PipeForm::same,
          title | language,
          adts},

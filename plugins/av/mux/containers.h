@@ -80,7 +80,8 @@ enum : unsigned {
     pixels = 16,       // its header says what the pixels are
     bigPcm = 32,       // PCM has the high byte first
     needsVideo = 64,
-    wrapsPictures = 128  // raw ones go to the libraries as their frames
+    wrapsPictures = 128,  // raw ones go to the libraries as their frames
+    soundHeader = 256     // the engine's raw encoder puts one before the first sample
 };
 }
 

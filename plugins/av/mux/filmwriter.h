@@ -45,6 +45,8 @@ class FilmWriter {
     bool close();
 
     const MuxTrack& track(std::size_t number) const { return tracks_[number]; }
+    // Raw sound may begin with the engine's header, which is no sound.
+    bool hasSoundHeader() const { return job_.container->is(MuxTrait::soundHeader); }
     std::size_t tracks() const { return tracks_.size(); }
     long long written(std::size_t track) const { return written_[track]; }  // units
     bool fail(const std::string& problem);

@@ -279,8 +279,22 @@ int Multiplexer::open() {
     return QvStatus::ok;
 }
 
+// An encoder that could not be opened has said why itself, and there is no film.
+bool Multiplexer::encoderFailed() const {
+    std::size_t track = 0;
+    for (const int type : {qvVideoStream, qvAudioStream})
+        for (int nr = 0; nr < nrStreams(type); ++nr) {
+            const QvBufStream& from = *stream(type, nr);
+            if (!from.enabled()) continue;
+            const QvCodec* const encoder = from.atachee();
+            if (!film_->track(track++).described() && encoder && encoder->errorCode() != 0) return true;
+        }
+    return false;
+}
+
 int Multiplexer::close() {
     if (getState() != qvStateOpen) return QvStatus::ok;
+    if (!film_->failed() && encoderFailed()) return abort();
     for (const int type : {qvVideoStream, qvAudioStream})
         for (int nr = 0; nr < nrStreams(type); ++nr)
             if (!static_cast<UnitStream*>(stream(type, nr))->finish())

@@ -78,6 +78,7 @@ class Multiplexer : public BaseMuxer {
     int fail();
     int describe(int type, int nr, const Container& container, std::vector<class MuxTrack>& tracks);
     int check();
+    bool encoderFailed() const;
     void end();
     QvBufStream* streamAt(int index) const;
 };

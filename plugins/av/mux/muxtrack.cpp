@@ -11,6 +11,7 @@
 #include "core/media/qvframe.h"
 #include "plugins/av/mux/pixelprobe.h"
 #include "plugins/av/source/limits.h"
+#include "plugins/av/source/soundlayout.h"
 
 #pragma GCC diagnostic push
 #pragma GCC diagnostic ignored "-Wconversion"
@@ -181,10 +182,8 @@ bool MuxTrack::describe(const QvWire::AudioHead& head) {
     timeBase_ = {1, head.rate};
     rate_ = {head.rate, 1};
     if (head.mask != 0) av_channel_layout_from_mask(&to.ch_layout, head.mask);
-    if (to.ch_layout.nb_channels != head.channels) {
-        av_channel_layout_uninit(&to.ch_layout);
-        av_channel_layout_default(&to.ch_layout, head.channels);
-    }
+    if (to.ch_layout.nb_channels != head.channels && !setUsualLayout(to.ch_layout, head.channels))
+        return fail("there is no memory for it");
     to.bits_per_raw_sample = head.bits;
     to.frame_size = std::max(head.frameSize, 0);
     to.initial_padding = std::max(head.initialPadding, 0);

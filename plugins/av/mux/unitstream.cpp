@@ -21,7 +21,8 @@ namespace {
 constexpr unsigned firstBytes = 4096;
 constexpr unsigned chunkBytes = 1 << 20;
 constexpr unsigned mostBytes = limits::allocation - chunkBytes;
-constexpr int soundBlocks = 25;  // of raw sound a second
+constexpr int soundBlocks = 25;      // of raw sound a second
+constexpr unsigned headerBytes = 6;  // before it
 
 struct FreeBuffer {
     void operator()(AVBufferRef* buffer) const { av_buffer_unref(&buffer); }
@@ -46,6 +47,7 @@ class UnitStream::Record final : public Bufstream {
         if (raw_ && !is.video()) {
             sample_ = static_cast<unsigned>(is.sampleBytes());
             block_ = static_cast<unsigned>(std::max(is.parameters().sample_rate / soundBlocks, 1)) * sample_;
+            headerDue_ = film.hasSoundHeader();
         }
     }
 
@@ -58,6 +60,7 @@ class UnitStream::Record final : public Bufstream {
     unsigned confirm(unsigned n) override {
         n = buffer_ ? std::min(n, capacity_ - filled_) : 0;
         filled_ += n;
+        if (headerDue_) dropHeader();
         return sample_ == 0 || filled_ < block_ || putSound() ? n : 0;
     }
     unsigned copybytes(unsigned char* p, unsigned n) override {
@@ -100,6 +103,18 @@ class UnitStream::Record final : public Bufstream {
     unsigned block_ = 0;   // of it
     std::unique_ptr<AVBufferRef, FreeBuffer> buffer_;
     unsigned filled_ = 0, capacity_ = 0, lastUnit_ = 0;
+
+    bool headerDue_ = false;
+
+    // "LPCM" and two bytes of its form, which the encoder's parameters say, too.
+    void dropHeader() {
+        static constexpr char mark[] = {'L', 'P', 'C', 'M'};
+        if (filled_ < headerBytes) return;
+        headerDue_ = false;
+        if (std::memcmp(buffer_->data, mark, sizeof mark) != 0) return;
+        filled_ -= headerBytes;
+        std::memmove(buffer_->data, buffer_->data + headerBytes, filled_);
+    }
 
     bool isVideo() const { return film_.track(track_).video(); }
 

@@ -302,6 +302,11 @@ TEST(VideoEncoders, RefuseWhatTheyCanNotDo) {
                  {"avOptions", "no equals sign"},
                  {"avOptions", "stats=/tmp/x"},
                  {"avOptions", "x264-params=dump-yuv=/tmp/x"},
+                 {"avOptions", "x264-params=pass=1"},
+                 {"avOptions", "flags=+pass1"},
+                 {"avOptions", "threads=9"},
+                 {"avOptions", "time_base=1/9"},
+                 {"avOptions", "colorspace=rgb"},
                  {"meta", "text"}};
     for (const auto& row : wrong) EXPECT_NE(encoder->setParam(row.name, row.value), 0) << row.name;
     EXPECT_NE(encoder->setParam("avOptions", "aq-mod=1"), 0);
@@ -401,13 +406,71 @@ TEST(SoundEncoders, WriteWhatADecoderReads) {
     }
 }
 
+// Each channel has a loudness of its own, so that it is known after decoding. The tone is low enough for the
+// channel of low frequencies.
+TEST(SoundEncoders, KeepChannelsInTheirPlaces) {
+    const struct {
+        const char* module;
+        AVCodecID decoder;
+        std::vector<int> counts;
+    } cases[] = {{"aacaenc", AV_CODEC_ID_AAC, {1, 3, 4, 5, 6, 8}},
+                 {"opusaenc", AV_CODEC_ID_OPUS, {1, 3, 4, 5, 6, 7, 8}},
+                 {"flacaenc", AV_CODEC_ID_FLAC, {3, 4, 7}},
+                 {"ddaenc", AV_CODEC_ID_AC3, {3, 4, 5, 6}}};
+    constexpr int samples = 24000;
+    for (const auto& c : cases)
+        for (const int channels : c.counts) {
+            SCOPED_TRACE(c.module + std::to_string(channels));
+            const auto encoder = made<QvAudioEncoder>(c.module, AnyDict("channels", channels));
+            if (c.decoder != AV_CODEC_ID_FLAC) {
+                EXPECT_EQ(encoder->setParam("aBitrate", channels == 1 ? 128 : 448), 0);
+            }
+            Collector out;
+            encoder->attachOutStream(&out);
+            QvPcm pcm;
+            pcm.init(samples, channels, 2, 48000);
+            for (int i = 0; i < samples; ++i)
+                for (int k = 0; k < channels; ++k)
+                    reinterpret_cast<std::int16_t*>(pcm.ptr(i))[k] =
+                        static_cast<std::int16_t>(2000 * (k + 1) * std::sin(i * 0.008 + k));
+            pcm.setSamples(samples);
+            ASSERT_EQ(encoder->open(), 0) << encoder->errorDesc();
+            EXPECT_EQ(encoder->writePcm(&pcm), 0) << encoder->errorDesc();
+            EXPECT_EQ(encoder->close(), 0) << encoder->errorDesc();
+            std::vector<double> squares(static_cast<std::size_t>(channels));
+            for (const auto& block : decoded(out, c.decoder)) {
+                ASSERT_EQ(block->ch_layout.nb_channels, channels);
+                for (int i = 0; i < block->nb_samples * channels; ++i) {
+                    const int k = i % channels;
+                    const bool planar = av_sample_fmt_is_planar(static_cast<AVSampleFormat>(block->format));
+                    const auto* const data = block->extended_data[planar ? k : 0];
+                    const int at = planar ? i / channels : i;
+                    const double value = block->format == AV_SAMPLE_FMT_FLTP
+                                             ? 32768.0 * reinterpret_cast<const float*>(data)[at]
+                                             : reinterpret_cast<const std::int16_t*>(data)[at];
+                    squares[static_cast<std::size_t>(k)] += value * value;
+                }
+            }
+            for (int k = 0; k < channels; ++k)
+                EXPECT_NEAR(std::sqrt(squares[static_cast<std::size_t>(k)] * 2 / samples) / 2000, k + 1, 0.4)
+                    << k;
+        }
+    // Rates of MPEG-2 have bit rates of their own.
+    const auto slow = made<QvAudioEncoder>("mpegaenc", AnyDict("samplerate", 22050));
+    EXPECT_EQ(slow->QvCodec::getParam("aBitrate"), 160);
+    EXPECT_NE(slow->setParam("aBitrate", 224), 0);
+}
+
 TEST(SoundEncoders, RefuseWhatTheyCanNotDo) {
     const auto encoder = made<QvAudioEncoder>("opusaenc", AnyDict());
     EXPECT_NE(encoder->setParam("samplerate", 44100), 0);
     EXPECT_NE(encoder->setParam("channels", 9), 0);
     EXPECT_NE(encoder->setParam("bitsPerSample", 20), 0);
     EXPECT_NE(encoder->setParam("bitrate", QvBitrate(QvBitrate::cbr, 129000)), 0);
-    EXPECT_NE(encoder->setParam("avOptions", "bogus=1"), 0);
+    for (const char* options : {"bogus=1", "ar=8000", "ac=1", "ch_layout=mono", "threads=9"})
+        EXPECT_NE(encoder->setParam("avOptions", options), 0) << options;
+    EXPECT_NE(encoder->setParam("avOptions", "aplication=voip"), 0);
+    EXPECT_NE(std::string(encoder->errorDesc()).find("'application'"), std::string::npos);
     EXPECT_EQ(av::newEncoder("nosuchenc"), nullptr);
 }
 

@@ -1,0 +1,91 @@
+// Films that the tool writes, as ffprobe and ffmpeg read them, and why others are refused.
+#include <gmock/gmock.h>
+
+#include <filesystem>
+
+#include "tests/plugins/av/films.h"
+
+namespace {
+
+using testing::AllOf;
+using testing::HasSubstr;
+using testing::Not;
+
+class FilmJobs : public FilmsInTheTool {
+  protected:
+    Outcome job(const std::string& picture, const Words& options) const {
+        Words words = {"transcode", "testgen:" + picture + ",rate=25,duration=0.4", "-y", "-q"};
+        words.insert(words.end(), options.begin(), options.end());
+        return tarsel(words);
+    }
+    std::string facts(const std::string& name) const {
+        return runProgram({"/usr/bin/env", "ffprobe", "-v", "error", "-show_streams", folder.file(name)}).out;
+    }
+    std::string samples(const std::string& name) const {
+        const std::string raw = folder.file("samples.raw");
+        EXPECT_EQ(ffmpeg({"-i", folder.file(name), "-f", "s16le", raw}).status, 0) << name;
+        return TempFolder::read(raw);
+    }
+};
+
+TEST_F(FilmJobs, areWhatTheirOptionsSay) {
+    const struct {
+        const char *name, *picture;
+        Words options;
+        const char* fact;
+    } rows[] = {
+        {"a.mov", "size=96x64", {"--vcodec", "proresvenc:codecProfile=proxy"}, "codec_tag_string=apco"},
+        {"b.mov", "size=96x64", {"--vcodec", "proresvenc:codecProfile=4444"}, "codec_tag_string=ap4h"},
+        {"c.mxf", "size=96x64", {"--vcodec", "proresvenc"}, "codec_name=prores"},
+        {"d.mkv",
+         "size=96x64",
+         {"--vcodec", "h265venc:avOptions=x265-params=aq-mode=1", "--bitrate", "300k", "--two-pass"},
+         "codec_name=hevc"},
+    };
+    for (const auto& row : rows) {
+        SCOPED_TRACE(row.name);
+        Words options = row.options;
+        options.insert(options.end(), {"-o", row.name});
+        const Outcome made = job(row.picture, options);
+        EXPECT_EQ(made.status, 0) << made.err;
+        EXPECT_THAT(facts(row.name), HasSubstr(row.fact));
+        const Outcome read = ffmpeg({"-xerror", "-i", folder.file(row.name), "-map", "0", "-f", "null", "-"});
+        EXPECT_EQ(read.status, 0) << read.err;
+        EXPECT_EQ(read.err, "");
+    }
+}
+
+// The engine puts a header before raw sound for MXF.
+TEST_F(FilmJobs, haveTheSoundsOfMxfUnchanged) {
+    for (const char* channels : {"1", "2", "6"})
+        for (const char* codec : {"rawaenc", "mpegpcmenc"}) {
+            const auto make = [&](const Words& more) {
+                Words words = {"--acodec", codec, "--samplerate", "48000", "--channels", channels};
+                words.insert(words.end(), more.begin(), more.end());
+                const Outcome made = job("size=720x576", words);
+                EXPECT_EQ(made.status, 0) << made.err;
+            };
+            make({"--vcodec", "dvvenc", "-o", "a.mxf"});
+            make({"--no-video", "-o", "a.mov"});
+            EXPECT_EQ(samples("a.mxf").size(), samples("a.mov").size()) << channels << codec;
+            EXPECT_TRUE(samples("a.mxf") == samples("a.mov")) << channels << codec;
+        }
+}
+
+TEST_F(FilmJobs, areRefusedWithTheEncodersOwnReason) {
+    const struct {
+        Words options;
+        const char* why;
+    } rows[] = {
+        {{"--vcodec", "h264venc:avOptions=max_pixels=1", "-o", "x.mkv"}, "does not take these settings"},
+        {{"--vcodec", "mpeg4venc:avOptions=threads=100000", "-o", "x.mkv"}, "own parameters decide"},
+    };
+    for (const auto& row : rows) {
+        const Outcome made = job("size=96x64", row.options);
+        EXPECT_NE(made.status, 0);
+        EXPECT_THAT(made.err, AllOf(HasSubstr(row.why), Not(HasSubstr("not described"))));
+        EXPECT_FALSE(std::filesystem::exists(folder.file("x.mkv")));
+    }
+}
+
+}  // namespace
