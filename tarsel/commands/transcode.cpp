@@ -186,6 +186,14 @@ void addJobOptions(Command& command, GivenJob& given, Need inputs) {
     command.option("--bitrate", job.encoders.bitrate, "Bit rate of the picture: 800k, 5M, ...", "RATE");
     command.option("--audio-bitrate", job.encoders.audioBitrate, "Bit rate of the sound: 128k, ...", "RATE");
     command.flag("--two-pass", job.encoders.twoPass, "Read the picture twice, to spend its bits better");
+    command.list(
+        "--meta", job.tags.given,
+        "What the output says of itself: title=..., artist=..., timecode=HH:MM:SS:FF; empty for none",
+        "KEY=VALUE");
+    command.option("--language", job.tags.languages, "Languages of the sounds, three letters each: eng,fra",
+                   "CODE,...");
+    command.flag("--no-meta", job.tags.none,
+                 "Leave out titles, chapters, timecode and languages of the INPUTs");
     command.flag("--match", job.match, "Choose the values nearest to the INPUT that the preset allows");
     command.flag("--join", job.join,
                  "The INPUTs are segments NAME[@FROM-TO], one after the other; A+B is read side by side");

@@ -1,6 +1,7 @@
 #include "tarsel/job/outputpipe.h"
 
 #include <string_view>
+#include <utility>
 
 #include "tarsel/job/plan/presetplan.h"
 #include "tarsel/source/setting.h"
@@ -12,6 +13,13 @@ namespace {
 void setOptional(QvCodec& codec, const char* name, const Any& value) {
     try {
         codec.setParam(name, value);
+    } catch (const QvParamException&) {  // not one of its parameters
+    }
+}
+
+void setStreamOptional(QvMuxer& muxer, const PlannedStream& stream, const char* name, const Any& value) {
+    try {
+        muxer.setStreamParam(stream.type, stream.number, name, value);
     } catch (const QvParamException&) {  // not one of its parameters
     }
 }
@@ -36,6 +44,17 @@ void addStream(QvEncodePipe& pipe, const OutputForm& output, const PlannedStream
     if (pipe.addStream(stream.type, Any(stream.encoder().c_str())) < 0)
         throw failure(Msg::outputNoStream, {output.name, stream.isVideo() ? "picture" : "sound"});
     setFormat(*pipe.encoder(stream.type, stream.number), stream);
+}
+
+// What a multiplexer has already, as that of a stored task, stays.
+void setTags(QvEncodePipe& pipe, const JobPlan& plan) {
+    if (plan.output.kind != OutputKind::module) return;
+    QvMuxer& muxer = *pipe.getMuxer();
+    if (plan.tags) setOptional(muxer, "tags", Any(*plan.tags));
+    for (const PlannedStream& stream : plan.streams)
+        for (const auto& [name, text] :
+             {std::pair{"language", &stream.language}, std::pair{"title", &stream.title}})
+            if (!text->empty()) setStreamOptional(muxer, stream, name, Any(text->c_str()));
 }
 
 // The settings of the streams are those that the plan has found.
@@ -80,6 +99,7 @@ void fitToPlace(QvEncodePipe& pipe, const JobPlan& plan, bool acceptPartial) {
     if (raw) muxer.setParam("exactName", toStream ? 1 : 0);
     // What was written there can't be gone back to.
     if (!raw && toStream) setOptional(muxer, "seekable", 0);
+    setTags(pipe, plan);
     if (!raw || !toStream || acceptPartial) return;
     for (const PlannedStream& stream : plan.streams)
         if (!stream.isVideo())

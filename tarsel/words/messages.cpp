@@ -248,6 +248,13 @@ constexpr Message kMessages[] = {
     {Msg::encoderNoTwoPass,  Exit::usage,  "--two-pass",                             "the encoder {name} works in one pass",                  "leave it out, or choose another encoder with --vcodec"},
     {Msg::encoderNoStream,   Exit::usage,  "{option}",                               "the output has no {text}",                              "leave it out"},
     {Msg::bitrateWrong,      Exit::usage,  "{option}",                               "{name} is no bit rate",                                 "write 800k, 5M, or a number of bits a second"},
+    {Msg::metaKeyWrong,      Exit::usage,  "{option}",                               "{name} can't be the name of a text",                    "use letters, digits, - and _, 40 at most: title, artist, album, date, comment, ..."},
+    {Msg::metaValueWrong,    Exit::usage,  "{option} {name}",                        "the text has characters that no film keeps",            "leave out control characters, and write UTF-8"},
+    {Msg::metaTimecodeWrong, Exit::usage,  "{option} timecode",                      "{name} is no timecode",                                 "write HH:MM:SS:FF, or HH:MM:SS;FF where numbers are dropped"},
+    {Msg::metaLanguage,      Exit::usage,  "{option} language",                      "each sound has a language of its own",                  "give --language"},
+    {Msg::metaNoRoom,        Exit::usage,  "{option}",                               "{file} has no room for it",                             "leave it out, or write a film such as .mp4 or .mkv"},
+    {Msg::languageWrong,     Exit::usage,  "{option}",                               "{name} is no language",                                 "give the three letters of ISO 639-2: eng, fra, deu, ..."},
+    {Msg::languageNoSound,   Exit::usage,  "{option}",                               "there are more languages than sounds, of which there are {text}", "give as many, or fewer"},
     {Msg::outputNoModule,    Exit::module, "can't write {file}",                     "this installation can't write any output",              "install the engine again"},
     {Msg::aviNoModule,       Exit::module, "can't write {file}",                     "this installation has no AVI output",                   "choose another format"},
     // captions

@@ -248,6 +248,13 @@ enum class Msg : unsigned short {
     encoderNoTwoPass,
     encoderNoStream,
     bitrateWrong,
+    metaKeyWrong,
+    metaValueWrong,
+    metaTimecodeWrong,
+    metaLanguage,
+    metaNoRoom,
+    languageWrong,
+    languageNoSound,
     outputNoModule,
     aviNoModule,
     // captions

@@ -6,6 +6,7 @@
 #include <iterator>
 
 #include "core/arch/qvexception.h"
+#include "core/engine/log/qvlog.h"
 #include "core/measure/fourcc.h"
 #include "core/media/qvframe.h"
 #include "plugins/av/encode/libraryoptions.h"
@@ -103,6 +104,7 @@ void VideoEnc::release() {
     context_.reset();
     packet_.reset();
     input_.close();
+    captions_.reset();
     files_.remove();
     statistics_.clear();
     sets_.clear();
@@ -299,6 +301,15 @@ bool VideoEnc::sendHead() {
     return output_.head(head);
 }
 
+bool VideoEnc::carryCaptions(const QvFrame& frame, AVFrame& picture) {
+    if (!frame.subpic() && !captions_.used()) return true;
+    const bool before = captions_.used(), kept = settings_.codec->has(VideoTrait::captions);
+    const bool done = captions_.attach(frame, picture);
+    if (captions_.used() && !before && !kept && !settings_.firstPass)
+        qv_log()->warning("The captions of the pictures are lost: %s does not keep them", displayName());
+    return done;
+}
+
 int VideoEnc::writeFrame(QvFrame* frame) {
     if (getState() != qvStateOpen) return setError(QvStatus::illegalState, "Not opened");
     if (!frame) return setError(QvStatus::invalidArgument, "No frame given");
@@ -309,7 +320,7 @@ int VideoEnc::writeFrame(QvFrame* frame) {
                         empty ? 0 : frame->width(), empty ? 0 : frame->height(),
                         empty ? "no format" : frame->str_four_cc(), settings_.width, settings_.height);
     AVFrame* const picture = input_.take(*frame);
-    if (!picture) return setError(QvStatus::outOfMemory, "Out of memory");
+    if (!picture || !carryCaptions(*frame, *picture)) return setError(QvStatus::outOfMemory, "Out of memory");
     picture->pts = frames_;
     picture->sample_aspect_ratio = context_->sample_aspect_ratio;
     picture->color_range = context_->color_range;

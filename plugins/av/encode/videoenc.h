@@ -17,6 +17,7 @@
 #include "plugins/av/encode/passrecord.h"
 #include "plugins/av/encode/unitwriter.h"
 #include "plugins/av/encode/videosettings.h"
+#include "plugins/av/picture/picturecaptions.h"
 
 namespace av {
 
@@ -42,6 +43,7 @@ class VideoEnc : public QvVideoEncoder {
     CodecPtr context_;
     PacketPtr packet_;
     FrameInput input_;
+    CaptionInput captions_;
     UnitWriter output_;
     PassFiles files_;
     std::string statistics_;          // of a first pass, or for a second one
@@ -49,6 +51,7 @@ class VideoEnc : public QvVideoEncoder {
     long long frames_ = 0, units_ = 0;
 
     int fail(const std::string& why);
+    bool carryCaptions(const QvFrame& frame, AVFrame& picture);
     std::string prepare();
     std::string configure(AVPixelFormat layout);
     std::string configureRate();

@@ -42,14 +42,14 @@ double secondsOf(const Any& value) {
 }
 
 // A chapter ends where the next one begins.
-bool setChapters(AVFormatContext& film, const AnyVector& chapters, double seconds) {
+bool setChapters(AVFormatContext& film, const AnyVector& chapters, double seconds, double start) {
     constexpr AVRational milliseconds{1, 1000};
     std::vector<std::pair<std::int64_t, std::string>> starts;
     for (const Any& entry : chapters) {
         if (!entry.isDict()) return false;
         const double time = secondsOf(entry.asDict().get("time"));
         if (!(time >= 0) || time > 1e9) return false;
-        starts.emplace_back(std::llround(time * 1000), textOf(entry.asDict().get("title")));
+        starts.emplace_back(std::llround((time + start) * 1000), textOf(entry.asDict().get("title")));
     }
     std::sort(starts.begin(), starts.end());
     auto** const list = static_cast<AVChapter**>(av_calloc(starts.size(), sizeof(AVChapter*)));
@@ -64,13 +64,22 @@ bool setChapters(AVFormatContext& film, const AnyVector& chapters, double second
         chapter->start = starts[i].first;
         chapter->end = i + 1 < starts.size()
                            ? starts[i + 1].first
-                           : std::max<std::int64_t>(std::llround(seconds * 1000), chapter->start);
+                           : std::max<std::int64_t>(std::llround((seconds + start) * 1000), chapter->start);
         if (!starts[i].second.empty()) av_dict_set(&chapter->metadata, "title", starts[i].second.c_str(), 0);
     }
     return true;
 }
 
-void setTimecode(AVFormatContext& film, const std::string& timecode) {
+// Numbers are dropped at the rates of NTSC only; elsewhere the libraries refuse such a timecode.
+bool dropsNumbers(const AVStream& pictures) {
+    const AVRational rate = pictures.avg_frame_rate;
+    return rate.den == 1001 && (rate.num + rate.den / 2) / rate.den % 30 == 0;
+}
+
+void setTimecode(AVFormatContext& film, std::string timecode) {
+    for (unsigned i = 0; i < film.nb_streams; ++i)
+        if (film.streams[i]->codecpar->codec_type == AVMEDIA_TYPE_VIDEO && !dropsNumbers(*film.streams[i]))
+            std::replace(timecode.begin(), timecode.end(), ';', ':');
     av_dict_set(&film.metadata, "timecode", timecode.c_str(), 0);
     for (unsigned i = 0; i < film.nb_streams; ++i)
         if (film.streams[i]->codecpar->codec_type == AVMEDIA_TYPE_VIDEO) {
@@ -92,7 +101,7 @@ void setTag(AVFormatContext& film, const Container& container, const char* tag, 
 }  // namespace
 
 std::string setFilmWords(AVFormatContext& film, const Container& container, const AnyDict& meta,
-                         double seconds) {
+                         double seconds, double start) {
     std::string lost;
     const auto lose = [&lost](const char* name) { lost += (lost.empty() ? "" : ", ") + std::string(name); };
     const auto holds = [&container](unsigned word) { return (container.words & word) != 0; };
@@ -101,7 +110,8 @@ std::string setFilmWords(AVFormatContext& film, const Container& container, cons
         if (std::any_of(std::begin(ofSource), std::end(ofSource), is)) continue;
         if (is("chapters")) {
             if (!value->isVector() || value->asVector().empty()) continue;
-            if (!holds(FilmWord::chapters) || !setChapters(film, value->asVector(), seconds)) lose(key);
+            if (!holds(FilmWord::chapters) || !setChapters(film, value->asVector(), seconds, start))
+                lose(key);
             continue;
         }
         const std::string text = textOf(*value);

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <climits>
+#include <cmath>
 #include <cstring>
 #include <functional>
 #include <string_view>
@@ -118,7 +119,7 @@ bool FilmWriter::begin() {
     made->strict_std_compliance = FF_COMPLIANCE_EXPERIMENTAL;
     for (MuxTrack& track : tracks_)
         if (!addStream(track)) return failWith("a stream could not be made", AVERROR(ENOMEM));
-    const std::string lost = setFilmWords(*made, *job_.container, job_.meta, seconds());
+    const std::string lost = setFilmWords(*made, *job_.container, job_.meta, seconds(), startTime());
     if (!lost.empty()) qv_log()->warning("'%s' does not hold: %s", job_.name.c_str(), lost.c_str());
     AVDictionary* options = nullptr;
     setOptions(&options);
@@ -157,6 +158,20 @@ double FilmWriter::seconds() const {
     for (const MuxTrack& track : tracks_)
         if (track.video()) return job_.frames * av_q2d(track.timeBase());
     return 0;
+}
+
+// Where the library moves all times for packets of priming that come before the film, in whole milliseconds.
+// Other containers have lists of edits, or their own word for priming, as Matroska has for Opus.
+double FilmWriter::startTime() const {
+    const std::string_view format = job_.format;
+    if (format != "matroska" && format != "webm") return 0;
+    double longest = 0;
+    for (const MuxTrack& track : tracks_) {
+        const AVCodecParameters& is = track.parameters();
+        if (track.video() || is.codec_id == AV_CODEC_ID_OPUS || is.sample_rate < 1) continue;
+        longest = std::max(longest, std::round(1000.0 * is.initial_padding / is.sample_rate) / 1000);
+    }
+    return longest;
 }
 
 // The index of MP4: per unit its length, of video also its times; per chunk, which is a run of units of one

@@ -84,6 +84,7 @@ class FilmWriter {
     void setOptions(AVDictionary** options);
     long long indexBytes() const;
     double seconds() const;
+    double startTime() const;
     bool putMade(std::size_t track);
     bool put(std::size_t track, AVPacket& unit);
     bool failWith(const char* what, int code);

@@ -47,6 +47,10 @@ constexpr QvParamRow<Settings> settingRows[] = {
     {"_totalFrames", &Settings::totalFrames, qvParamWriteOnly, 0, INT_MAX, "", "",
      "pictures to come, 0: not known"},
     {.name = "meta", .member = &Settings::meta, .help = "title, timecode, chapters and the like"},
+    {.name = "tags",
+     .member = &Settings::tags,
+     .help = "in the place of meta: title, timecode, chapters and the like",
+     .type = Any::Dict},
     {.name = "avOptions",
      .member = &Settings::avOptions,
      .flags = qvParamStored | qvParamByHand,
@@ -156,12 +160,14 @@ void Multiplexer::store(AnyDict& state) const {
     state.set("name", name());
     qvStoreParamRows<Settings>(settingRows, settings_, state);
     state.set("avOptions", Any(settings_.avOptions.c_str()));
+    if (settings_.tags.isDict()) state.set("tags", settings_.tags);
 }
 
 int Multiplexer::restore(const AnyDict& state) {
     if (!(state.get("name") == name())) return setError(QvStatus::failed, "restore - invalid name");
     if (state.isSet("avOptions"))
         if (const int result = checkOptions(state.get("avOptions"))) return result;
+    settings_.tags = state.get("tags").isDict() ? state.get("tags") : Any();
     return _restoreRows<Settings>(settingRows, settings_, state);
 }
 
@@ -188,22 +194,21 @@ QvBufStream* Multiplexer::addStream(int type, const AnyDict& params) {
     return keep(type, std::move(made));
 }
 
-QvBufStream* Multiplexer::streamAt(int index) const {
-    const int videos = nrStreams(qvVideoStream);
-    if (index < 0 || index >= nrStreams(qvAllStreams)) return nullptr;
-    return index < videos ? stream(qvVideoStream, index) : stream(qvAudioStream, index - videos);
+QvBufStream* Multiplexer::streamAt(int type, int number) const {
+    const bool known = type == qvVideoStream || type == qvAudioStream;
+    return known && number >= 0 && number < nrStreams(type) ? stream(type, number) : nullptr;
 }
 
-int Multiplexer::setStreamParam(int program, int index, const char* name, const Any& value) {
-    QvBufStream* const to = streamAt(index);
+int Multiplexer::setStreamParam(int type, int number, const char* name, const Any& value) {
+    QvBufStream* const to = streamAt(type, number);
     const bool known = std::strcmp(name, "language") == 0 || std::strcmp(name, "title") == 0;
-    if (!known || !to || !value.isText()) return BaseMuxer::setStreamParam(program, index, name, value);
+    if (!known || !to || !value.isText()) return BaseMuxer::setStreamParam(type, number, name, value);
     return to->setParam(name, value);
 }
 
-void Multiplexer::getStreamParams(int, int index, AnyDict& params) const {
+void Multiplexer::getStreamParams(int type, int number, AnyDict& params) const {
     params.clear();
-    QvBufStream* const of = streamAt(index);
+    QvBufStream* const of = streamAt(type, number);
     for (const char* name : {"language", "title"})
         if (of && of->getParam(name).isText()) params.set(name, of->getParam(name));
 }
@@ -255,7 +260,7 @@ int Multiplexer::open() {
     job.seekable = settings_.seekable < 0 ? regularFile() : settings_.seekable != 0;
     job.fastStart = settings_.fastStart;
     job.frames = settings_.totalFrames;
-    job.meta = settings_.meta;
+    job.meta = settings_.tags.isDict() ? settings_.tags.asDict() : settings_.meta;
     job.options = settings_.avOptions;
     if (!job.seekable && container->pipe == PipeForm::none)
         return setError(QvStatus::failed,

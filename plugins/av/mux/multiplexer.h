@@ -23,7 +23,8 @@ class FilmWriter;
 //   "samplerate", "channels", "bitsPerSample"
 //                48000, 2, 16 what "dummyaenc" passes on: the form of samples that come without an encoder
 //   "language"   ""           of all streams of sound that have none, ISO 639-2
-//   "meta"       Dict         see setFilmWords
+//   "meta"       Dict         see setFilmWords; the engine sets what the input of the first picture has
+//   "tags"       -            Dict in the place of "meta", even an empty one. It stays, and is stored
 //
 // addStream takes "language" and "title" of a stream, too, and so does setStreamParam.
 class Multiplexer : public BaseMuxer {
@@ -36,6 +37,7 @@ class Multiplexer : public BaseMuxer {
         std::string avOptions, language;
         Any filename;
         AnyDict meta;
+        Any tags;
     };
 
     explicit Multiplexer(const Container& container);
@@ -52,9 +54,9 @@ class Multiplexer : public BaseMuxer {
     using QvCodec::getParam;
     void store(AnyDict& state) const override;
     int restore(const AnyDict& state) override;
-    // `stream` counts all streams, pictures first. "language" and "title".
-    int setStreamParam(int program, int stream, const char* name, const Any& value) override;
-    void getStreamParams(int program, int stream, AnyDict& params) const override;
+    // "language" and "title" of the `stream`-th of a type, as the encode pipe addresses them.
+    int setStreamParam(int type, int stream, const char* name, const Any& value) override;
+    void getStreamParams(int type, int stream, AnyDict& params) const override;
 
     // Null beyond the streams that the container holds.
     QvBufStream* addStream(int type, const AnyDict& params) override;
@@ -80,7 +82,7 @@ class Multiplexer : public BaseMuxer {
     int check();
     bool encoderFailed() const;
     void end();
-    QvBufStream* streamAt(int index) const;
+    QvBufStream* streamAt(int type, int number) const;
 };
 
 // A new multiplexer, owned by the caller; null for a module that is none.

@@ -2,6 +2,8 @@
 
 #include <algorithm>
 
+#include "tarsel/words/xmlnames.h"
+
 QvRatio InputStream::rate() const {
     return type == qvVideoStream ? picture.rate.rate() : QvRatio(sound.samplerate, 1);
 }
@@ -10,6 +12,20 @@ std::optional<QvFramerate> JobInput::frameRate() const {
     if (video.empty()) return std::nullopt;
     return video.front().picture.rate;
 }
+
+namespace {
+
+void readWords(const QvDecodePipe& decoder, int type, int number, InputStream& stream) {
+    const auto word = [&](const char* name) {
+        const Any text = decoder.getStreamParam(type, number, name);
+        const std::string found = text.isText() ? text.toString().asString("") : "";
+        return xmlKeeps(found) ? found : "";
+    };
+    stream.language = word("language");
+    stream.title = word("title");
+}
+
+}  // namespace
 
 JobInput readInput(const Source& source) {
     JobInput input;
@@ -21,6 +37,7 @@ JobInput readInput(const Source& source) {
         InputStream stream;
         stream.units = decoder.nrFrames(i);
         stream.picture = pictureFormat(source, i);
+        readWords(decoder, qvVideoStream, i, stream);
         input.video.push_back(stream);
     }
     for (int i = 0; i < decoder.nrStreams(qvAudioStream); ++i) {
@@ -31,7 +48,10 @@ JobInput readInput(const Source& source) {
         stream.units = decoder.getAudioParam(i, "samples").asInt64(decoder.nrSamples(i));
         // A mix has 32 bits, of which 24 are used.
         stream.sound = {ask("samplerate"), ask("channels"), std::min(ask("bitsPerSample"), 24)};
+        readWords(decoder, qvAudioStream, i, stream);
         input.audio.push_back(stream);
     }
+    if (const Any meta = static_cast<const QvCodec&>(decoder).getParam("meta"); meta.isDict())
+        input.meta = meta.asDict();
     return input;
 }

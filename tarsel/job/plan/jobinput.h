@@ -19,6 +19,7 @@ struct InputStream {
     long long units = 0;       // frames or samples
     PictureFormat picture;     // of video
     SoundFormat sound;         // of audio
+    std::string language, title;
 
     // Frames or samples a second.
     QvRatio rate() const;
@@ -31,6 +32,7 @@ struct JobInput {
     std::string damage;    // see Source::damage
     double duration = -1;  // seconds of the longest stream; negative when unknown
     std::vector<InputStream> video, audio;
+    AnyDict meta;         // what it says of itself, see filmtags.h; empty for nothing
     bool joined = false;  // its sound is those of other inputs, side by side, as --map takes them
     bool joins = false;   // there
 

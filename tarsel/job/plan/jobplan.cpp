@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <new>
 
+#include "tarsel/job/plan/filmtags.h"
 #include "tarsel/job/plan/filters.h"
 #include "tarsel/job/plan/lengths.h"
 #include "tarsel/job/plan/points.h"
@@ -51,6 +52,8 @@ void takeStreams(JobPlan& plan, const PlanOptions& options, const KnownFormats* 
                 stream.part.input = static_cast<int>(input);
                 stream.part.stream = static_cast<int>(i);
                 stream.picture = streams[i].picture;
+                stream.language = streams[i].language;
+                stream.title = streams[i].title;
                 const auto number = static_cast<size_t>(stream.number);
                 stream.sound = known && number < known->sounds.size()
                                    ? known->sounds[number]
@@ -212,6 +215,10 @@ JobPlan planJob(const PlanOptions& options, const OutputForm& output, std::vecto
     filters.plan();
     sounds.planFilters();
     preset.settle();
+    if (known) return plan;
+    checkTags(plan.output, options.tags);
+    planLanguages(plan.streams, options.tags);
+    plan.tags = filmTags({&plan}, options.tags);
     return plan;
 }
 
@@ -231,6 +238,8 @@ std::string planText(const JobPlan& plan) {
         if (stream.isRaw()) text += ", " + std::to_string(stream.bytes(stream.expected)) + " bytes";
         text += "\n";
     }
+    if (plan.output.kind == OutputKind::module && plan.tags && !plan.tags->empty())
+        text += "meta    " + tagsText(*plan.tags) + "\n";
     if (plan.preset && !plan.preset->reason().empty())
         text += "preset  " + inQuotes(plan.preset->name()) + ", " + plan.preset->reason() + "\n";
     const bool nowhere = plan.output.place == OutputPlace::nowhere;

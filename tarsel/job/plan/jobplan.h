@@ -3,6 +3,7 @@
 // printed without a file; JobRun carries it out.
 #pragma once
 
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -27,6 +28,7 @@ struct PlannedStream {
     std::string module;  // encoder of a stored task or a preset; empty for the one that writes raw streams
     AnyDict codec;       // what a preset sets it to
     std::string set;     // what the options set of it, to be shown
+    std::string language, title;
     // The format that is written.
     PictureFormat picture;           // of video
     SoundFormat sound;               // of audio
@@ -56,6 +58,8 @@ struct JobPlan {
     std::vector<JobInput> inputs;
     std::vector<PlannedStream> streams;
     FilterFiles filterFiles;
+    // What the output says of itself, see filmtags.h; not set for what the multiplexer has already.
+    std::optional<AnyDict> tags;
     std::vector<std::string> warnings;
     std::vector<std::string> notes;  // lines for the user that are no warnings
 

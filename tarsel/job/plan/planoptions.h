@@ -23,6 +23,13 @@ enum class OutputKind {
     byInput,  // a stream whose name does not say it: raw pictures, or WAV where there is no picture
 };
 
+// What the output says of itself.
+struct TagOptions {
+    std::vector<std::string> given;  // "key=value", in place of what the inputs say
+    std::string languages;           // of the sounds, in their order: "eng,fra"
+    bool none = false;               // nothing of the inputs
+};
+
 struct PlanOptions {
     bool joins() const { return join || !cuts.empty(); }
 
@@ -36,6 +43,7 @@ struct PlanOptions {
     EffectOptions effects;
     SoundOptions sound;
     EncoderOptions encoders;
+    TagOptions tags;
     EncoderOptions::Settings muxerSettings;
     std::optional<int> samplerate, channels, bits;
     bool noVideo = false, noAudio = false;

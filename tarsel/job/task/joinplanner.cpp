@@ -4,6 +4,7 @@
 #include <cstdio>
 #include <optional>
 
+#include "tarsel/job/plan/filmtags.h"
 #include "tarsel/job/plan/filters.h"
 #include "tarsel/job/plan/inputfit.h"
 #include "tarsel/job/task/divide.h"
@@ -71,8 +72,17 @@ void JoinPlanner::plan() {
     whole_.streams = join_.streams();
     checkOutput(whole_, options_);
     checkEffects(whole_, options_.effects);
+    planTags();
     if (const std::string given = options_.sound.given(); !given.empty() && known_.sounds.empty())
         throw failure(Msg::effectNoSound, {given});
+}
+
+void JoinPlanner::planTags() {
+    std::vector<const JobPlan*> parts;
+    for (const JoinedSegment& segment : join_.segments) parts.push_back(&segment.plan);
+    checkTags(form_, options_.tags);
+    planLanguages(whole_.streams, options_.tags);
+    whole_.tags = filmTags(parts, options_.tags);
 }
 
 bool JoinPlanner::levelIsCommon() const {

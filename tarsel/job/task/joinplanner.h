@@ -38,6 +38,7 @@ class JoinPlanner {
     PlanOptions optionsOf(const SegmentWords& words, const std::vector<JobInput>& inputs, bool first,
                           bool last) const;
     void add(const SegmentWords& words, bool first, bool last);
+    void planTags();
     void remember(const JobPlan& plan);
 
     const PlanOptions& options_;

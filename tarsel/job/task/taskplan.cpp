@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cstring>
 
+#include "tarsel/job/plan/filmtags.h"
 #include "tarsel/job/plan/lengths.h"
 #include "tarsel/job/plan/soundplan.h"
 #include "tarsel/words/messages.h"
@@ -88,6 +89,14 @@ PlannedStream plannedStream(JobPlan& plan, const TransLink& link, int input) {
     return stream;
 }
 
+bool hasTags(const StoredTask& task) {
+    try {
+        return task.task().encoder()->getMuxer()->QvCodec::getParam("tags").isDict();
+    } catch (const QvParamException&) {  // not one of its parameters
+        return false;
+    }
+}
+
 }  // namespace
 
 OutputKind taskOutputKind(const StoredTask& task) {
@@ -116,5 +125,7 @@ JobPlan planTask(const StoredTask& task, const OutputForm& output, std::vector<J
     planFrames(plan);
     planSamples(plan);
     if (task.isJoin()) plan.notes.clear();  // silence may be anywhere
+    if (output.kind == OutputKind::module && !task.isJoin() && !hasTags(task))
+        plan.tags = filmTags({&plan}, {});
     return plan;
 }

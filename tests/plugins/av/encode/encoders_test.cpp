@@ -6,6 +6,7 @@
 #include <memory>
 
 #include "core/arch/qvexception.h"
+#include "core/caption/cc/qvcc.h"
 #include "core/encode/qvencoder.h"
 #include "core/measure/qvgeometry.h"
 #include "core/media/qvbuffer.h"
@@ -247,6 +248,46 @@ TEST(VideoEncoders, WriteWhatADecoderReads) {
                                     AVCOL_SPC_BT709, false));
             paint(frame, i);
             EXPECT_GE(quality(*wanted.take(frame), got), c.least) << i;
+        }
+    }
+}
+
+TEST(VideoEncoders, KeepCaptions) {
+    for (const auto& [module, codec] :
+         {std::pair{"h264venc", AV_CODEC_ID_H264}, std::pair{"mpegvenc", AV_CODEC_ID_MPEG2VIDEO}}) {
+        SCOPED_TRACE(module);
+        const auto encoder =
+            made<QvVideoEncoder>(module, AnyDict("width", 96, "height", 64, "framerate", QvFramerate(25.0)));
+        Collector out;
+        encoder->attachOutStream(&out);
+        ASSERT_EQ(encoder->open(), 0) << encoder->errorDesc();
+        QvFrame frame;
+        frame.init(QvFourcc::I420, 96, 64);
+        std::vector<std::string> wanted(frames);
+        // More than a picture holds in the third one: the rest comes with the next.
+        for (int i = 0; i < frames; ++i) {
+            QvCcData captions;
+            for (int k = 0; k < (i == 2 ? 40 : i % 3); ++k)
+                captions.append(QvCcBytePair(i & 1, 'a' + i, 'A' + k, true));
+            AnyDict carried;
+            captions.store(carried);
+            frame.setSubpic(carried);
+            paint(frame, i);
+            EXPECT_EQ(encoder->writeFrame(&frame), 0);
+            for (int k = 0; k < captions.count(); ++k)
+                wanted[static_cast<std::size_t>(k < 31 ? i : i + 1)] +=
+                    {static_cast<char>(captions.at(k).header), static_cast<char>(captions.at(k).byte1),
+                     static_cast<char>(captions.at(k).byte2)};
+        }
+        EXPECT_EQ(encoder->close(), 0);
+        const auto pictures = decoded(out, codec);
+        ASSERT_EQ(pictures.size(), wanted.size());
+        for (std::size_t i = 0; i < wanted.size(); ++i) {
+            const AVFrameSideData* const block =
+                av_frame_get_side_data(pictures[i].get(), AV_FRAME_DATA_A53_CC);
+            const std::string got =
+                block ? std::string(reinterpret_cast<const char*>(block->data), block->size) : "";
+            EXPECT_EQ(got, wanted[i]) << i;
         }
     }
 }

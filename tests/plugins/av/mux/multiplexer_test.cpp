@@ -437,8 +437,10 @@ TEST_F(FilmWithSound, keepsItsWordsAndNamesWhatIsLost) {
         ASSERT_EQ(mux(module, *film, to, params), "");
         const Outcome shown = runProgram({"/usr/bin/env", "ffprobe", "-v", "error", "-show_chapters",
                                           "-show_format", "-show_streams", to});
+        // Matroska has its first picture after the priming of AAC.
+        const char* const second = module == "mkvmux" ? "start_time=1.521000" : "start_time=1.500000";
         for (const char* part :
-             {"title=A film", "=Somebody", "=01:02:03:04", "title=One", "start_time=1.500000", "title=Two"})
+             {"title=A film", "=Somebody", "=01:02:03:04", "title=One", second, "title=Two"})
             EXPECT_THAT(shown.out, HasSubstr(part));
         EXPECT_THAT(shown.out, testing::AnyOf(HasSubstr("language=deu"), HasSubstr("language=ger")));
         EXPECT_TRUE(decoded(to, "v") == decoded(file, "v"));
