@@ -38,6 +38,12 @@ constexpr QvParamRow<Settings> rows[] = {
      .min = 0,
      .max = 64,
      .help = "threads of each stream's codec; 0: one a core"},
+    {.name = "upright",
+     .member = &Settings::upright,
+     .flags = qvParamStored,
+     .min = 0,
+     .max = 1,
+     .help = "1: pictures are turned as the film says; 0: they are as they are coded"},
     {.name = "container",
      .member = &Settings::container,
      .flags = qvParamStored,
@@ -183,12 +189,15 @@ void AvDec::addStreams(MediaInput& input, std::string& reason) {
             if (stream.codecpar->codec_type != AVMEDIA_TYPE_VIDEO || isCover(stream) != covers) continue;
             std::string why;
             auto reader = FrameReader::open(*bytes_, settings_.container, static_cast<int>(i), index_,
-                                            settings_.threads, why);
+                                            {settings_.threads, settings_.upright != 0}, why);
             if (!reader) {
                 leaveOut(i, why);
                 continue;
             }
             if (!zero.known && !covers) zero = {true, reader->zero(), reader->zeroBase()};
+            if (settings_.upright && reader->format().turn.any())
+                qv_log()->warning("Stream %u of '%s' is not turned upright: its pixel format can't be turned",
+                                  i, filename().toString().asString(""));
             auto* const added = addStream(std::make_unique<PictureStream>(std::move(reader), stream));
             const double rate = added->reader().format().rate.rate().ratio();
             if (!covers && isCut(i)) added->setTruncated(announcedUnits(stream, container, rate));

@@ -11,9 +11,12 @@ std::string codecName(AVCodecID codec);    // as people know it: "H.264", "MPEG-
 int fieldOrderOf(const AVFrame& picture);  // 0 progressive, 1 top field first, 2 bottom field first
 int matrixOf(const AVFrame& picture);      // QvYUVMatrix
 struct Turn {
-    int clockwise = 0;  // degrees to be shown upright: 0, 90, 180, 270
-    bool mirrored = false;
+    int clockwise = 0;      // degrees to be shown upright: 0, 90, 180, 270
+    bool mirrored = false;  // top to bottom, before it is turned
+
+    bool any() const { return clockwise != 0 || mirrored; }
 };
-Turn turnOf(const AVStream& stream);
+// What the picture itself says (a photograph does), or the container of its stream.
+Turn turnOf(const AVStream& stream, const AVFrame& picture);
 
 }  // namespace av
