@@ -409,6 +409,23 @@ void Source::selectAll() {
                 throw failure(Msg::streamRefused, {name_, type == 1 ? "video" : "audio", std::to_string(i)});
 }
 
+std::string Source::concealed() const {
+    std::string text;
+    for (int type : {1, 2}) {
+        long long count = 0;
+        for (int i = 0; i < open_->nrStreams(type); ++i) {
+            AnyDict params;
+            open_->getStreamParams(type, i, params);
+            if (open_->isSelected(type, i)) count += params.getInt64("concealed", 0);
+        }
+        if (count == 0) continue;
+        if (!text.empty()) text += " and ";
+        text += std::to_string(count) + (type == 1 ? " picture" : " packet") + (count == 1 ? "" : "s") +
+                (type == 1 ? "" : " of sound");
+    }
+    return text;
+}
+
 std::string Source::damage() const {
     if (const std::string mixed = mixDamage(*open_); !mixed.empty()) return mixed;
     for (int i = 0; i < open_->nrStreams(kSubpicture); ++i)

@@ -47,6 +47,9 @@ class Source {
     double duration() const;
     // Why the file holds less than its header says, or more than whole frames; empty when it is whole.
     std::string damage() const;
+    // What of that which was read so far could not be decoded, as "3 pictures and 1 packet of sound"; empty
+    // for nothing.
+    std::string concealed() const;
 
     // Selects every video and audio stream.
     void selectAll();

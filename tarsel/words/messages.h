@@ -155,6 +155,7 @@ enum class Msg : unsigned short {
     endsNoSound,
     soundEndsFirst,
     soundCut,
+    filmConcealed,
     soundFilled,
     soundClipped,
     loudnessNoSound,

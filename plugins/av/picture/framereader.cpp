@@ -153,6 +153,8 @@ bool FrameReader::Decoding::findFirst(std::string& reason) {
         reason = "none of its pictures can be decoded";
         return false;
     }
+    concealed_ += static_cast<int>(*comingNumber_);
+    counted_.erase(counted_.begin(), counted_.begin() + static_cast<std::ptrdiff_t>(*comingNumber_));
     pictures_.erase(pictures_.begin(), pictures_.begin() + static_cast<std::ptrdiff_t>(*comingNumber_));
     numberPackets();
     comingNumber_ = 0;

@@ -59,7 +59,9 @@ class FrameReader {
     Read read();
     QvFrame& frame() { return *frame_; }
     const std::string& failure() const { return failure_; }
-    int concealed() const;  // pictures so far that the codec reported as damaged, or did not deliver
+    // Pictures so far that the codec reported as damaged, or did not deliver; those before picture 0, which
+    // need others that are not in the file, from the start.
+    int concealed() const;
 
   private:
     class Decoding;
