@@ -36,7 +36,7 @@ constexpr int kGap = 8;            // pixels between its pictures
 
 struct Given {
     std::string input, raw, at, output, sheet, threads;
-    bool strict = false;
+    bool strict = false, noRotate = false;
     ProgressOption progress;
     EffectOptions effects;
     OutputOptions outputOptions;
@@ -173,7 +173,8 @@ void frame(Given& given) {
     if (!given.stream && !(extension == "png")) throw failure(Msg::pictureName, {"-o", given.output});
     if (!given.stream && NumberedName::parse(fs::path(given.output).filename().string()))
         throw failure(Msg::pictureNumbered, {given.output});
-    Source source(given.input, given.raw);
+    Source source(given.input, given.raw, nullptr,
+                  given.noRotate ? Source::Turned::asCoded : Source::Turned::upright);
     if (!given.stream) given.outputs = std::make_shared<Outputs>(given.output, "-o", source.files(), policy);
     if (source.decoder().nrStreams(1) == 0) throw failure(Msg::fileNoPicture, {given.input});
     source.selectAll();
@@ -204,6 +205,7 @@ void addFrame(CommandLine& line, Signals& signals, const std::string& version) {
                    "The instant: SS.mmm, HH:MM:SS, 120f, HH:MM:SS:FF; -10 counts from the end", "TIME");
     command.option("--sheet", given->sheet, "A sheet of COLUMNSxROWS pictures", "NxM");
     command.option("--raw", given->raw, "Format of a raw file: size=WxH,pixel=FORMAT,rate=R", "K=V,...");
+    command.flag("--no-rotate", given->noRotate, "Keep a film as it is coded, not turned upright");
     command.option("-o,--output", given->output, "The picture; - is the standard output", "FILE.png",
                    Need::required);
     addEffectOptions(command, given->effects);

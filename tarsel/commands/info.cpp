@@ -303,7 +303,7 @@ void info(const Given& given) {
                 all.push_back(showTask(name, given.json));
                 continue;
             }
-            const Source source(name, given.raw, standard.get());
+            const Source source(name, given.raw, standard.get(), Source::Turned::asCoded);
             all.push_back(describe(source));
             if (!given.json) printFile(all.back());
             if (all.back().contains("damage"))

@@ -199,6 +199,7 @@ void addJobOptions(Command& command, GivenJob& given, Need inputs) {
                  "The INPUTs are segments NAME[@FROM-TO], one after the other; A+B is read side by side");
     command.list("--cut", job.cuts, "A part of the INPUTs; several are joined in this order", "FROM-TO");
     command.option("--raw", job.raw, "Format of a raw input: size=WxH,pixel=FORMAT,rate=R", "K=V,...");
+    command.flag("--no-rotate", job.noRotate, "Keep films as they are coded, not turned upright");
     command.option("--from", job.from,
                    "First instant taken: SS.mmm, HH:MM:SS, 120f, HH:MM:SS:FF; -10 counts from the end",
                    "TIME");

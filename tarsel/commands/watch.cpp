@@ -18,7 +18,7 @@ struct Given {
     std::string folder, base, moveTo, failedTo, state, settle, scan, raw, threads;
     std::vector<std::string> presets;
     bool keep = false, remove = false, once = false, overwrite = false, retryFailed = false, quiet = false;
-    bool acceptPartial = false, strict = false;
+    bool acceptPartial = false, strict = false, noRotate = false;
     ProgressOption progress;
 };
 
@@ -61,6 +61,7 @@ WatchOptions optionsOf(const Given& given, const std::string& folder, const Watc
     options.raw = given.raw;
     if (!given.threads.empty()) options.jobOptions.push_back("--threads=" + given.threads);
     if (given.acceptPartial) options.jobOptions.push_back("--accept-partial");
+    if (given.noRotate) options.jobOptions.push_back("--no-rotate");
     if (given.strict) options.jobOptions.push_back("--strict");
     return options;
 }
@@ -105,6 +106,7 @@ void addWatch(CommandLine& line, Signals& signals, const std::string& version) {
                    "SECONDS");
     command.option("--state", given->state, "The record of what was done (FOLDER/.watch.tarsel)", "FILE");
     command.option("--raw", given->raw, "Format of raw inputs: size=WxH,pixel=FORMAT,rate=R", "K=V,...");
+    command.flag("--no-rotate", given->noRotate, "Keep films as they are coded, not turned upright");
     command.flag("--accept-partial", given->acceptPartial,
                  "Accept a damaged input and take what can be read");
     command.flag("--strict", given->strict, "Let a file fail if there is a warning");

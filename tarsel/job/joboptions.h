@@ -12,6 +12,7 @@
 
 struct JobOptions : PlanOptions {
     std::string raw;                               // format of a raw input
+    bool noRotate = false;                         // films stay as they are coded
     std::shared_ptr<StandardInput> standardInput;  // read once, for all attempts; null when it is no input
     std::string post;                              // command that is run afterwards
     ProgressMode progress;

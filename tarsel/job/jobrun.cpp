@@ -172,6 +172,9 @@ void JobRun::addEngineWarnings() {
 void JobRun::checkAndCommit() {
     lengths_.check(!plan_.output.isStream());
     addEngineWarnings();
+    for (const auto& source : parts_.sources)
+        if (const std::string text = source->concealed(); !text.empty())
+            warnings_.add(lineOf(Msg::filmConcealed, {source->name(), text}));
     if (const std::string lost = Events::get().lost(); !lost.empty()) warnings_.add(lost);
     if (endedEarly_) {
         const std::string& name = plan_.input(*endedEarly_).name;

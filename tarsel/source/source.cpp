@@ -131,7 +131,7 @@ AnyDict stateOf(const QvCodec& codec) {
     return state;
 }
 
-Source::Source(const std::string& spec, const std::string& raw, StandardInput* standard)
+Source::Source(const std::string& spec, const std::string& raw, StandardInput* standard, Turned turned)
     : name_(spec), formatName_(spec) {
     if (isGenerator(spec)) {
         isFile_ = false;
@@ -139,7 +139,7 @@ Source::Source(const std::string& spec, const std::string& raw, StandardInput* s
         openGenerator(spec);
     } else if (spec == StandardInput::kName) {
         takeStandard(standard, !raw.empty());
-        raw.empty() ? openFile() : openRaw(raw);
+        raw.empty() ? openFile(turned) : openRaw(raw);
     } else if (raw.empty() && isCardFolder(spec)) {
         decoder_ = openCard(spec);
         name_ = decoder_->QvCodec::getParam("filename").toString().asString("");
@@ -147,7 +147,7 @@ Source::Source(const std::string& spec, const std::string& raw, StandardInput* s
     } else {
         files_.push_back(spec);
         requireInput(spec);
-        raw.empty() ? openFile() : openRaw(raw);
+        raw.empty() ? openFile(turned) : openRaw(raw);
     }
     open_ = decoder_.get();
     takeMixed();
@@ -296,6 +296,12 @@ Any openParameters(const std::string& name) {
     return Any();
 }
 
+// Whether the reader of films is the first that is tried.
+bool isFilm(const std::string& name) {
+    const AnyVector readers = qv_registry()->decoders(QvFile::getExt(Any(name.c_str()), true).asString());
+    return !readers.empty() && readers.at(0) == "avdec";
+}
+
 }  // namespace
 
 std::string Source::head(size_t most) const {
@@ -327,11 +333,12 @@ void Source::takeMixed() {
     for (const std::string& file : inputFilesOf(*open_)) files_.push_back(file);
 }
 
-void Source::openFile() {
+void Source::openFile(Turned turned) {
     if (isMixName(formatName_)) decoder_ = openViews(name_);
     if (!decoder_ && isMixName(formatName_)) decoder_ = openMix(name_);
     if (decoder_) return;
-    const Any params = openParameters(formatName_);
+    Any params = openParameters(formatName_);
+    if (turned == Turned::upright && isFilm(formatName_)) params = AnyDict("upright", 1);
     Any error;
     if (standard_) {
         requireDecoder();
@@ -400,6 +407,23 @@ void Source::selectAll() {
         for (int i = 0; i < open_->nrStreams(type); ++i)
             if (open_->select(type, i) != QvStatus::ok)
                 throw failure(Msg::streamRefused, {name_, type == 1 ? "video" : "audio", std::to_string(i)});
+}
+
+std::string Source::concealed() const {
+    std::string text;
+    for (int type : {1, 2}) {
+        long long count = 0;
+        for (int i = 0; i < open_->nrStreams(type); ++i) {
+            AnyDict params;
+            open_->getStreamParams(type, i, params);
+            if (open_->isSelected(type, i)) count += params.getInt64("concealed", 0);
+        }
+        if (count == 0) continue;
+        if (!text.empty()) text += " and ";
+        text += std::to_string(count) + (type == 1 ? " picture" : " packet") + (count == 1 ? "" : "s") +
+                (type == 1 ? "" : " of sound");
+    }
+    return text;
 }
 
 std::string Source::damage() const {

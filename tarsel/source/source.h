@@ -15,7 +15,10 @@ class Source {
     // `spec`: a file name, "testgen:size=1280x720,rate=25,duration=10", or "-" for `standard`, which then
     // outlives this; null where the standard input is not taken. `raw`: the format of a raw file
     // ("size=352x288,pixel=I420,rate=25"), empty to open by extension. Throws Failure.
-    Source(const std::string& spec, const std::string& raw, StandardInput* standard = nullptr);
+    // Films are turned as they say that they are to be shown, unless they are wanted as coded.
+    enum class Turned { upright, asCoded };
+    Source(const std::string& spec, const std::string& raw, StandardInput* standard = nullptr,
+           Turned turned = Turned::upright);
     // One that is open already; it has to outlive this.
     explicit Source(QvDecodePipe& decoder);
     // The same for a decoder that reads others.
@@ -44,6 +47,9 @@ class Source {
     double duration() const;
     // Why the file holds less than its header says, or more than whole frames; empty when it is whole.
     std::string damage() const;
+    // What of that which was read so far could not be decoded, as "3 pictures and 1 packet of sound"; empty
+    // for nothing.
+    std::string concealed() const;
 
     // Selects every video and audio stream.
     void selectAll();
@@ -51,7 +57,7 @@ class Source {
   private:
     void openGenerator(const std::string& spec);
     void openRaw(const std::string& raw);
-    void openFile();
+    void openFile(Turned turned);
     void takeStandard(StandardInput* standard, bool isRaw);
     void takeMixed();  // the files of a mix
     std::string requireDecoder() const;

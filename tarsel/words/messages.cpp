@@ -157,6 +157,7 @@ constexpr Message kMessages[] = {
     {Msg::endsNoSound,     Exit::usage,  "{option}",                                            "this job has not both a picture and a sound",                           "leave it out"},
     {Msg::soundEndsFirst,  Exit::usage,  "--shortest",                                          "the sound of {file} ends within the first frame of the picture",        "leave it out"},
     {Msg::soundCut,        Exit::done,   "the sound of {file} is cut",                          "it lasts {text}, and the picture {text}",                               "--longest keeps all of it"},
+    {Msg::filmConcealed,   Exit::done,   "{file} is damaged in places",                         "{text} could not be decoded",                                           "pictures are repeated and sound is silent there"},
     {Msg::soundFilled,     Exit::done,   "the sound of {file} is followed by silence",          "it lasts {text}, and the picture {text}",                               "--shortest ends the picture with it"},
     {Msg::soundClipped,    Exit::done,   "audio stream {text} of {file} is clipped",            "{text} of its samples were beyond full scale",                          "lower it with --volume or --normalize"},
     {Msg::loudnessNoSound, Exit::input,  "{file} has no sound",                                 "there is nothing to measure",                                           "'tarsel info' shows what it holds"},

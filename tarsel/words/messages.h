@@ -157,6 +157,7 @@ enum class Msg : unsigned short {
     endsNoSound,
     soundEndsFirst,
     soundCut,
+    filmConcealed,
     soundFilled,
     soundClipped,
     loudnessNoSound,

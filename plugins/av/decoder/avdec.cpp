@@ -1,7 +1,5 @@
 #include "plugins/av/decoder/avdec.h"
 
-#include <algorithm>
-#include <cmath>
 #include <cstring>
 #include <new>
 
@@ -11,6 +9,7 @@
 #include "core/measure/qvgeometry.h"
 #include "core/stream/qvbytesource.h"
 #include "plugins/av/decoder/filmfacts.h"
+#include "plugins/av/decoder/filmlength.h"
 #include "plugins/av/decoder/filmstreams.h"
 #include "plugins/av/index/packetindex.h"
 #include "plugins/av/source/avheaders.h"
@@ -38,6 +37,12 @@ constexpr QvParamRow<Settings> rows[] = {
      .min = 0,
      .max = 64,
      .help = "threads of each stream's codec; 0: one a core"},
+    {.name = "upright",
+     .member = &Settings::upright,
+     .flags = qvParamStored,
+     .min = 0,
+     .max = 1,
+     .help = "1: pictures are turned as the film says; 0: they are as they are coded"},
     {.name = "container",
      .member = &Settings::container,
      .flags = qvParamStored,
@@ -47,53 +52,6 @@ static_assert(qvParamTableOk<Settings>(rows));
 
 // A picture of the cover or of a title, which is no film, unless there is nothing else.
 bool isCover(const AVStream& stream) { return (stream.disposition & AV_DISPOSITION_ATTACHED_PIC) != 0; }
-
-// Seconds that the container announces for a stream; 0 for unknown.
-double announced(const AVStream& stream, const AVFormatContext& container) {
-    // Of AVI the library has a length that fits to the size of the file.
-    const bool pictures = stream.codecpar->codec_type == AVMEDIA_TYPE_VIDEO;
-    if (std::strcmp(container.iformat->name, "avi") == 0 && pictures && stream.nb_frames > 0)
-        return static_cast<double>(stream.nb_frames) * av_q2d(stream.time_base);
-    if (stream.duration != AV_NOPTS_VALUE)
-        return static_cast<double>(stream.duration) * av_q2d(stream.time_base);
-    if (container.duration != AV_NOPTS_VALUE) return static_cast<double>(container.duration) / AV_TIME_BASE;
-    return 0;
-}
-
-long long announcedUnits(const AVStream& stream, const AVFormatContext& container, double rate) {
-    const double units = announced(stream, container) * rate;
-    return units > 0 && units < 1e15 ? std::llround(units) : 0;
-}
-
-// Containers of one table of samples say how many packets there are.
-bool lacksPackets(const AVStream& stream, const AVFormatContext& container, std::size_t packets) {
-    return std::strstr(container.iformat->name, "mp4") && stream.nb_frames > 0 &&
-           static_cast<std::uint64_t>(stream.nb_frames) > packets;
-}
-
-// Containers whose header states the length of the film, which ends earlier than that.
-bool endsEarly(const AVFormatContext& container, const PacketIndex& index) {
-    const char* const name = container.iformat->name;
-    if (!std::strstr(name, "matroska") && std::strcmp(name, "avi") != 0) return false;
-    if (container.duration == AV_NOPTS_VALUE) return false;
-    double first = 0, last = 0;
-    bool any = false;
-    for (unsigned i = 0; i < container.nb_streams; ++i)
-        for (const IndexedPacket& packet : index.packets(static_cast<int>(i))) {
-            const std::int64_t time = packet.pts != AV_NOPTS_VALUE ? packet.pts : packet.dts;
-            if (time == AV_NOPTS_VALUE) continue;
-            const double unit = av_q2d(container.streams[i]->time_base);
-            const double start = static_cast<double>(time) * unit;
-            first = any ? std::min(first, start) : start;
-            last = std::max(any ? last : start, start + packet.duration * unit);
-            any = true;
-        }
-    double stated = static_cast<double>(container.duration) / AV_TIME_BASE;
-    for (unsigned i = 0; i < container.nb_streams; ++i)
-        if (container.streams[i]->codecpar->codec_type == AVMEDIA_TYPE_VIDEO)
-            stated = std::max(stated, announced(*container.streams[i], container));
-    return any && stated > (last - first) * 1.01 + 1;
-}
 
 }  // namespace
 
@@ -164,13 +122,7 @@ int AvDec::openFilm() {
 // line in the log; `reason` is the first of these.
 void AvDec::addStreams(MediaInput& input, std::string& reason) {
     const AVFormatContext& container = input.context();
-    const bool damaged = !index_->damage().empty();
-    const bool early = endsEarly(container, *index_);
-    const auto isCut = [&](unsigned number) {
-        return damaged || early ||
-               lacksPackets(*container.streams[number], container,
-                            index_->packets(static_cast<int>(number)).size());
-    };
+    const FilmLength length(container, *index_, fileSize_);
     FilmZero zero;
     const auto leaveOut = [&](unsigned number, const std::string& why) {
         qv_log()->warning("Stream %u of '%s' is left out: %s", number, filename().toString().asString(""),
@@ -183,18 +135,22 @@ void AvDec::addStreams(MediaInput& input, std::string& reason) {
             if (stream.codecpar->codec_type != AVMEDIA_TYPE_VIDEO || isCover(stream) != covers) continue;
             std::string why;
             auto reader = FrameReader::open(*bytes_, settings_.container, static_cast<int>(i), index_,
-                                            settings_.threads, why);
+                                            {settings_.threads, settings_.upright != 0}, why);
             if (!reader) {
                 leaveOut(i, why);
                 continue;
             }
             if (!zero.known && !covers) zero = {true, reader->zero(), reader->zeroBase()};
+            if (settings_.upright && reader->format().turn.any())
+                qv_log()->warning("Stream %u of '%s' is not turned upright: its pixel format can't be turned",
+                                  i, filename().toString().asString(""));
             auto* const added = addStream(std::make_unique<PictureStream>(std::move(reader), stream));
-            const double rate = added->reader().format().rate.rate().ratio();
-            if (!covers && isCut(i)) added->setTruncated(announcedUnits(stream, container, rate));
+            const PictureFormat& format = added->reader().format();
+            if (!covers && length.isCut(stream))
+                added->setTruncated(length.announced(stream, format.rate.rate().ratio(), format.frames));
         }
     };
-    if (damaged)
+    if (!index_->damage().empty())
         qv_log()->warning("'%s' is damaged: %s", filename().toString().asString(""),
                           index_->damage().c_str());
     addPictures(false);
@@ -212,8 +168,9 @@ void AvDec::addStreams(MediaInput& input, std::string& reason) {
             qv_log()->warning("The sound of stream %u of '%s' is not all there: %s", i,
                               filename().toString().asString(""), lost.c_str());
         auto* const added = addStream(std::make_unique<SoundStream>(std::move(reader), stream));
-        if (isCut(i))
-            added->setTruncated(announcedUnits(stream, container, added->reader().format().samplerate));
+        const SoundFormat& format = added->reader().format();
+        if (length.isCut(stream))
+            added->setTruncated(length.announced(stream, format.samplerate, format.samples));
     }
     if (streams().empty()) addPictures(true);
     facts_ = filmFacts(container, zero);

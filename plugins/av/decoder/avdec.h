@@ -5,24 +5,26 @@
 // independently: each has a demultiplexer of its own.
 //
 // Parameters: "source" (in the place of the file, see QvByteSource; it has to be sought), "threads" (stored;
-// of each stream's codec, 0: one a core), "container" (stored; the libraries' name of the format, "": found
-// out), "openParameters" and "settings" (a Dict of these).
+// of each stream's codec, 0: one a core), "upright" (stored; 1: frames are delivered as the film is to be
+// shown, turned and mirrored, and "rotation" and "mirrored" are absent then; 0, as it is at first: as they
+// are coded), "container" (stored; the libraries' name of the format, "": found out), "openParameters" and
+// "settings" (a Dict of these).
 //
 // A stream of pictures has, besides what the contract asks for:
 //
-//     "rotation"          Int32     degrees clockwise to be shown upright: 90, 180 or 270; absent for 0
-//     "mirrored"          Int32     1: it is to be shown mirrored
-//     "colourMatrix"      Int32     QvYUVMatrix, where the film states one of these
+// clang-format off
+//     "rotation"       Int32   degrees clockwise to be shown upright: 90, 180 or 270; absent for 0
+//     "mirrored"       Int32   1: it is to be shown mirrored top to bottom, before it is turned
+//     "colourMatrix"   Int32   QvYUVMatrix, where the film states one of these
 //     "colourPrimaries", "colourTransfer", "colourSpace"
-//                         Int32     code points of ITU-T H.273 (2020 non-constant is 9), where stated
-//     "variableRate"      Int32     1: "framerate" is the nearest usual rate, and frames repeat or skip
-//                                   pictures
-//     "conversion"        String    what the pixel format can't hold, or how the frames are made of the
-//                                   pictures
-//     "concealed"         Int64     pictures so far that were damaged or did not come
-//     "codecProfile"      String    of the codec: "High", "Main 10"
-//     "language", "title" String    where the container has them
-//     "codecParams"       Dict      "pid", where the container numbers its streams
+//                      Int32   code points of ITU-T H.273 (BT.2020 is 9), where stated
+//     "variableRate"   Int32   1: "framerate" is the nearest usual rate, frames repeat or skip pictures
+//     "conversion"     String  what the pixel format can't hold, or how the frames are made of the pictures
+//     "concealed"      Int64   pictures so far that were damaged or did not come
+//     "codecProfile"   String  of the codec: "High", "Main 10"
+//     "language"       String  where the container has it; so "title"
+//     "codecParams"    Dict    "pid", where the container numbers its streams
+// clang-format on
 //
 // A stream of sound has "codecProfile", "language", "title", "channelMask" (Int64), "conversion" (why it ends
 // early), "concealed" (packets) and "codecParams". AC-3 and E-AC-3 have the codec "Dolby", "codecProfile"
@@ -51,6 +53,7 @@ class AvDec : public BaseDecodePipe {
     struct Settings {
         QvByteSource* source = nullptr;  // borrowed; null: the file
         int threads = 0;
+        int upright = 0;
         std::string container;
     };
 

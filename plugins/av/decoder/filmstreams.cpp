@@ -46,8 +46,8 @@ PictureStream::PictureStream(std::unique_ptr<FrameReader> reader, const AVStream
     params.set("pal", format.rate.isPAL() ? 1 : 0);
     params.set("nrViews", 1);
     if (format.bitrate > 0) params.set("vBitrate", format.bitrate);
-    if (format.rotation != 0) params.set("rotation", format.rotation);
-    if (format.mirrored) params.set("mirrored", 1);
+    if (format.turn.clockwise != 0) params.set("rotation", format.turn.clockwise);
+    if (format.turn.mirrored) params.set("mirrored", 1);
     if (format.colourMatrix != 0) params.set("colourMatrix", format.colourMatrix);
     if (format.primaries != 0) params.set("colourPrimaries", format.primaries);
     if (format.transfer != 0) params.set("colourTransfer", format.transfer);

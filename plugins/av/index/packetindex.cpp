@@ -35,7 +35,7 @@ IndexedPacket indexed(const AVPacket& packet) {
 
 }  // namespace
 
-std::unique_ptr<PacketIndex> PacketIndex::build(MediaInput& input, std::string& reason) {
+std::unique_ptr<PacketIndex> PacketIndex::build(MediaInput& input, std::string& reason, bool whole) {
     auto index = std::make_unique<PacketIndex>();
     const AVFormatContext& container = input.context();
     index->streams_.resize(container.nb_streams);
@@ -46,6 +46,7 @@ std::unique_ptr<PacketIndex> PacketIndex::build(MediaInput& input, std::string& 
         reason = "out of memory";
         return nullptr;
     }
+    if (!whole) input.leaveBytes();
     std::size_t count = 0;
     for (;;) {
         const MediaInput::Read result = input.read(*packet);

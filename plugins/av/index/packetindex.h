@@ -31,7 +31,8 @@ class PacketIndex {
     // Reads `input` from its start to its end, all streams, and rewinds it. What a damaged file has up to its
     // damage is kept: damage() says what happened. Null with `reason` when there is not even a packet, or
     // more than the limits allow.
-    static std::unique_ptr<PacketIndex> build(MediaInput& input, std::string& reason);
+    // The bytes of the packets are not read where the container's tables say all, unless `whole`.
+    static std::unique_ptr<PacketIndex> build(MediaInput& input, std::string& reason, bool whole = false);
 
     const std::vector<IndexedPacket>& packets(int stream) const {
         return streams_[static_cast<unsigned>(stream)];

@@ -27,10 +27,11 @@ std::unique_ptr<DecodedPictures> DecodedPictures::open(const MediaBytes& bytes, 
     pictures->stream_ = stream;
     pictures->index_ = std::move(index);
     pictures->input_->selectOnly(stream);
-    return pictures->openCodec(threads, reason) ? std::move(pictures) : nullptr;
+    pictures->threads_ = threads;
+    return pictures->openCodec(reason) ? std::move(pictures) : nullptr;
 }
 
-bool DecodedPictures::openCodec(int threads, std::string& reason) {
+bool DecodedPictures::openCodec(std::string& reason) {
     const AVCodecParameters& parameters = *stream().codecpar;
     const AVCodec* const decoder = avcodec_find_decoder(parameters.codec_id);
     if (!decoder) {
@@ -49,7 +50,7 @@ bool DecodedPictures::openCodec(int threads, std::string& reason) {
     }
     codec_->pkt_timebase = stream().time_base;
     codec_->max_pixels = limits::pixels;
-    codec_->thread_count = std::clamp(threads > 0 ? threads : qv_platform().processors(), 1, mostThreads);
+    codec_->thread_count = std::clamp(threads_ > 0 ? threads_ : qv_platform().processors(), 1, mostThreads);
     codec_->thread_type = FF_THREAD_FRAME | FF_THREAD_SLICE;
     if (const int result = avcodec_open2(codec_.get(), decoder, nullptr); result < 0) {
         reason = std::string("its ") + avcodec_get_name(parameters.codec_id) + " can't be decoded (" +
@@ -63,8 +64,12 @@ bool DecodedPictures::seek(std::size_t packet) {
     const bool atStart = packet == 0 && !started_;
     waiting_ = draining_ = false;
     av_packet_unref(packet_.get());
-    avcodec_flush_buffers(codec_.get());
     position_ = packet;
+    // What a damaged stream has left in the codec is not all flushed; the start is that of a new one.
+    if (packet > 0 || atStart)
+        avcodec_flush_buffers(codec_.get());
+    else if (!openCodec(failure_))
+        return false;
     if (atStart) return true;
     const bool found =
         packet == 0 ? input_->rewind() : input_->seekTo(stream_, index_->keyOf(stream_, packet), packet);

@@ -45,9 +45,10 @@ class DecodedPictures {
     bool draining_ = false;
     bool started_ = false;  // something was read
     std::size_t position_ = 0;
+    int threads_ = 0;
     std::string failure_;
 
-    bool openCodec(int threads, std::string& reason);
+    bool openCodec(std::string& reason);
     // A packet into the codec, or the end. False for a failure of the file.
     bool feed();
 };

@@ -10,6 +10,7 @@
 #include "plugins/av/picture/picturecaptions.h"
 #include "plugins/av/picture/pictureform.h"
 #include "plugins/av/picture/picturetimes.h"
+#include "plugins/av/picture/pictureturner.h"
 #include "plugins/av/picture/picturewords.h"
 #include "plugins/av/source/limits.h"
 
@@ -56,7 +57,10 @@ class FrameReader::Decoding {
     const std::vector<TimedPicture>& pictures() const { return pictures_; }
     const PicturePlan& plan() const { return plan_; }
     int concealed() const { return concealed_; }
+    // The picture as it is delivered; null if it can't be turned.
+    const AVFrame* upright(const AVFrame& picture) const { return turner ? turner->turn(picture) : &picture; }
     std::unique_ptr<FormWriter> writer;
+    std::unique_ptr<PictureTurner> turner;  // null: as it is coded
 
   private:
     std::unique_ptr<DecodedPictures> source_;
@@ -149,6 +153,8 @@ bool FrameReader::Decoding::findFirst(std::string& reason) {
         reason = "none of its pictures can be decoded";
         return false;
     }
+    concealed_ += static_cast<int>(*comingNumber_);
+    counted_.erase(counted_.begin(), counted_.begin() + static_cast<std::ptrdiff_t>(*comingNumber_));
     pictures_.erase(pictures_.begin(), pictures_.begin() + static_cast<std::ptrdiff_t>(*comingNumber_));
     numberPackets();
     comingNumber_ = 0;
@@ -294,9 +300,7 @@ void FrameReader::Decoding::describe(PictureFormat& format) {
     format.primaries = codePoint(first.color_primaries);
     format.transfer = codePoint(first.color_trc);
     format.space = codePoint(first.colorspace);
-    const Turn turn = turnOf(stream);
-    format.rotation = turn.clockwise;
-    format.mirrored = turn.mirrored;
+    format.turn = turnOf(stream, first);
     format.codec = codecName(source_->codec().codec_id);
     format.bitrate = static_cast<double>(stream.codecpar->bit_rate);
 }
@@ -307,24 +311,25 @@ FrameReader::~FrameReader() = default;
 int FrameReader::concealed() const { return decoding_->concealed(); }
 
 std::unique_ptr<FrameReader> FrameReader::open(const MediaBytes& bytes, const std::string& format, int stream,
-                                               std::shared_ptr<const PacketIndex> index, int threads,
-                                               std::string& reason) {
+                                               std::shared_ptr<const PacketIndex> index,
+                                               const Options& options, std::string& reason) {
     std::unique_ptr<FrameReader> reader(new FrameReader);
-    auto source = DecodedPictures::open(bytes, format, stream, std::move(index), threads, reason);
+    auto source = DecodedPictures::open(bytes, format, stream, std::move(index), options.threads, reason);
     if (!source) return nullptr;
     reader->decoding_ = std::make_unique<Decoding>(std::move(source));
     if (!reader->decoding_->begin(reason)) return nullptr;
-    if (!reader->describe()) {
+    if (!reader->describe(options.upright)) {
         reason = reader->failure_;
         return nullptr;
     }
     return reader;
 }
 
-bool FrameReader::describe() {
+bool FrameReader::describe(bool upright) {
     Decoding& decoding = *decoding_;
     decoding.describe(format_);
-    const AVFrame& first = decoding.first();
+    if (upright && format_.turn.any()) turnUpright();
+    const AVFrame& first = *decoding.upright(decoding.first());
     const PictureForm form = formOf(static_cast<AVPixelFormat>(first.format), isFullRange(first));
     if (form.fourcc == 0) {
         failure_ = "its pictures have a form that is not known";
@@ -345,6 +350,20 @@ bool FrameReader::describe() {
     return true;
 }
 
+// The frames are as the film is to be shown from here on, if their layout allows it.
+void FrameReader::turnUpright() {
+    auto turner = std::make_unique<PictureTurner>(format_.turn);
+    const AVFrame* const first = turner->turn(decoding_->first());
+    if (!first) return;
+    format_.turn = {};
+    format_.width = first->width;
+    format_.height = first->height;
+    format_.fieldOrder = fieldOrderOf(*first);
+    format_.rate = QvFramerate(format_.rate.rate(), format_.fieldOrder);
+    if (turner->swapsSides()) format_.pixelAspect = 1 / format_.pixelAspect;
+    decoding_->turner = std::move(turner);
+}
+
 bool FrameReader::seek(int n) {
     if (n < 0 || n > format_.frames) return false;
     next_ = n;
@@ -360,13 +379,14 @@ FrameReader::Read FrameReader::read() {
     if (result != Read::picture) return result;
     const AVFrame& picture = decoding_->picture();
     if (!decoding_->isWritten()) {
-        if (!decoding_->writer->write(picture, *frame_)) {
+        const AVFrame* const shownAs = decoding_->upright(picture);
+        if (!shownAs || !decoding_->writer->write(*shownAs, *frame_)) {
             failure_ = "a picture can't be converted";
             return Read::failed;
         }
+        frame_->framerate = QvFramerate(format_.rate.rate(), fieldOrderOf(*shownAs));
         decoding_->setWritten();
     }
-    frame_->framerate = QvFramerate(format_.rate.rate(), fieldOrderOf(picture));
     frame_->setYUVMatrix(static_cast<QvYUVMatrix>(format_.colourMatrix));
     frame_->frameNr = next_++;
     // A picture that stays says its captions once.

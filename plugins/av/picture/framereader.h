@@ -12,6 +12,7 @@
 
 #include "core/measure/qvframerate.h"
 #include "plugins/av/index/packetindex.h"
+#include "plugins/av/picture/picturewords.h"
 
 class QvFrame;
 struct AVFrame;
@@ -28,18 +29,20 @@ struct PictureFormat {
     int fieldOrder = 0;                          // the engine's value
     int colourMatrix = 0;                        // the engine's value
     int primaries = 0, transfer = 0, space = 0;  // code points of ITU-T H.273; 0: not stated
-    int rotation = 0;                            // 0, 90, 180, 270 degrees clockwise to be shown upright
-    bool mirrored = false;
-    std::string codec;   // as people know it: "H.264", "MPEG-2"
-    std::string lost;    // what the form can't hold, one line; "" for nothing
-    double bitrate = 0;  // bits a second; 0: unknown
+    Turn turn;                                   // how the frames are still to be turned
+    std::string codec;                           // as people know it: "H.264", "MPEG-2"
+    std::string lost;                            // what the form can't hold, one line; "" for nothing
+    double bitrate = 0;                          // bits a second; 0: unknown
 };
 
 class FrameReader {
   public:
-    // `threads` of the codec; 0: one a core.
+    struct Options {
+        int threads = 0;       // of the codec; 0: one a core
+        bool upright = false;  // frames are turned as the film says, where their layout allows it
+    };
     static std::unique_ptr<FrameReader> open(const MediaBytes& bytes, const std::string& format, int stream,
-                                             std::shared_ptr<const PacketIndex> index, int threads,
+                                             std::shared_ptr<const PacketIndex> index, const Options& options,
                                              std::string& reason);
     ~FrameReader();
     FrameReader(const FrameReader&) = delete;
@@ -57,7 +60,9 @@ class FrameReader {
     Read read();
     QvFrame& frame() { return *frame_; }
     const std::string& failure() const { return failure_; }
-    int concealed() const;  // pictures so far that the codec reported as damaged, or did not deliver
+    // Pictures so far that the codec reported as damaged, or did not deliver; those before picture 0, which
+    // need others that are not in the file, from the start.
+    int concealed() const;
 
   private:
     class Decoding;
@@ -69,7 +74,8 @@ class FrameReader {
     int next_ = 0;  // picture
 
     FrameReader();
-    bool describe();
+    bool describe(bool upright);
+    void turnUpright();
 };
 
 }  // namespace av

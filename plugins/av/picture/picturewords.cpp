@@ -68,10 +68,14 @@ int codePoint(int value) {
     return value > 0 && value < 256 && value != unspecified ? value : 0;
 }
 
-Turn turnOf(const AVStream& stream) {
+Turn turnOf(const AVStream& stream, const AVFrame& picture) {
     std::size_t bytes = 0;
-    const auto* data = reinterpret_cast<const std::int32_t*>(
-        av_stream_get_side_data(&stream, AV_PKT_DATA_DISPLAYMATRIX, &bytes));
+    const std::uint8_t* matrix = av_stream_get_side_data(&stream, AV_PKT_DATA_DISPLAYMATRIX, &bytes);
+    if (const auto* own = av_frame_get_side_data(&picture, AV_FRAME_DATA_DISPLAYMATRIX)) {
+        matrix = own->data;
+        bytes = own->size;
+    }
+    const auto* data = reinterpret_cast<const std::int32_t*>(matrix);
     if (!data || bytes < 9 * sizeof(std::int32_t)) return {};
     Turn turn;
     const auto product = [data](int a, int b) { return static_cast<double>(data[a]) * data[b]; };

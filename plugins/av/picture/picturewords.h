@@ -12,9 +12,12 @@ int fieldOrderOf(const AVFrame& picture);  // 0 progressive, 1 top field first, 
 int matrixOf(const AVFrame& picture);      // QvYUVMatrix
 int codePoint(int value);                  // of ITU-T H.273; 0 for what is reserved or not stated
 struct Turn {
-    int clockwise = 0;  // degrees to be shown upright: 0, 90, 180, 270
-    bool mirrored = false;
+    int clockwise = 0;      // degrees to be shown upright: 0, 90, 180, 270
+    bool mirrored = false;  // top to bottom, before it is turned
+
+    bool any() const { return clockwise != 0 || mirrored; }
 };
-Turn turnOf(const AVStream& stream);
+// What the picture itself says (a photograph does), or the container of its stream.
+Turn turnOf(const AVStream& stream, const AVFrame& picture);
 
 }  // namespace av

@@ -48,6 +48,14 @@ constexpr std::size_t nothing = static_cast<std::size_t>(-1);
 // How many packets are decoded at the start to see that the codec gives what the packets say.
 constexpr std::size_t probedPackets = 16;
 
+// Bytes of the frame of AMR that begins there; some containers put several into a packet, and the codec takes
+// the first one of these.
+int amrFrame(AVCodecID codec, int first) {
+    constexpr int narrow[16] = {13, 14, 16, 18, 20, 21, 27, 32, 6, 1, 1, 1, 1, 1, 1, 1},
+                  wide[16] = {18, 24, 33, 37, 41, 47, 51, 59, 61, 6, 1, 1, 1, 1, 1, 1};
+    return (codec == AV_CODEC_ID_AMR_WB ? wide : narrow)[first >> 3 & 15];
+}
+
 // Samples at the start that the header of Opus says are none of the sound.
 std::uint32_t ownPriming(const AVCodecParameters& codec) {
     constexpr int at = 10;
@@ -106,6 +114,7 @@ class SampleReader::Decoding {
     std::vector<std::uint32_t> counts_;    // of a packet: samples, until they are placed
     bool told_ = false;  // by the packets: priming and padding are cut here, not by the codec
     unsigned primingScale_ = 1;
+    std::uint32_t knownPriming_ = 0;  // what the codec knows of the encoder that made the stream
     SamplePlaces places_;
     std::size_t current_ = nothing;  // packet of the frame before
     long long within_ = 0;           // samples of it that were decoded
@@ -123,6 +132,7 @@ class SampleReader::Decoding {
     }
     bool openCodec(std::string& reason);
     bool seek(std::size_t packet);
+    int send();
     Next decode();
     Next outOfMemory() {
         failure_ = "out of memory";
@@ -189,6 +199,28 @@ bool SampleReader::Decoding::seek(std::size_t packet) {
     return found;
 }
 
+// The packet, or the first frame of what is left of it, into the codec.
+int SampleReader::Decoding::send() {
+    AVPacket& packet = *packet_;
+    const AVCodecID codec = codec_->codec_id;
+    if (packet.size == 0 || (codec != AV_CODEC_ID_AMR_NB && codec != AV_CODEC_ID_AMR_WB)) {
+        const int result = avcodec_send_packet(codec_.get(), &packet);
+        waiting_ = result == AVERROR(EAGAIN);
+        return result;
+    }
+    const int all = packet.size, bytes = std::min(amrFrame(codec, packet.data[0]), all);
+    packet.size = bytes;
+    const int result = avcodec_send_packet(codec_.get(), &packet);
+    packet.size = all;
+    waiting_ = result == AVERROR(EAGAIN);
+    if (!waiting_ && bytes < all) {
+        packet.data += bytes;
+        packet.size -= bytes;
+        waiting_ = true;
+    }
+    return result;
+}
+
 // The next frame of the codec, into frame_.
 SampleReader::Decoding::Next SampleReader::Decoding::decode() {
     for (;;) {
@@ -211,12 +243,10 @@ SampleReader::Decoding::Next SampleReader::Decoding::decode() {
             }
             codec_->reordered_opaque = static_cast<std::int64_t>(position_++);
         }
-        const int sent = avcodec_send_packet(codec_.get(), packet_.get());
+        const int sent = send();
         if (sent == AVERROR(ENOMEM)) return outOfMemory();
-        waiting_ = sent == AVERROR(EAGAIN);
-        if (waiting_) continue;
-        if (sent < 0) ++lost_;
-        av_packet_unref(packet_.get());
+        if (sent < 0 && sent != AVERROR(EAGAIN)) ++lost_;
+        if (!waiting_) av_packet_unref(packet_.get());
     }
 }
 
@@ -240,6 +270,9 @@ bool SampleReader::Decoding::decodesAsTold() {
         take(*frame_);
         const auto packet = static_cast<std::size_t>(frame_->reordered_opaque);
         if (!isSame() || packet >= decoded.size()) break;
+        if (const auto* skip = av_frame_get_side_data(frame_.get(), AV_FRAME_DATA_SKIP_SAMPLES);
+            skip && skip->size >= 4 && packet == 0 && decoded[0] == 0)
+            knownPriming_ = AV_RL32(skip->data);
         decoded[packet] += static_cast<std::uint64_t>(frame_->nb_samples);
     }
     // AAC states half of its rate where bands of high frequencies are added to it.
@@ -305,7 +338,8 @@ bool SampleReader::Decoding::place(bool hasZero, std::int64_t zero, std::int64_t
     const AVRational base = stream().time_base;
     const std::int64_t origin =
         hasZero ? av_rescale(zero, samplerate_, std::max<std::int64_t>(zeroBase, 1)) : 0;
-    places_.set(packets(), counts_, {told_, primingScale_, ownPriming(*stream().codecpar)},
+    places_.set(packets(), counts_,
+                {told_, primingScale_, std::max(ownPriming(*stream().codecpar), knownPriming_)},
                 {base.num, base.den, samplerate_, hasZero, origin});
     counts_ = {};
     format.samples = places_.samples();

@@ -1,11 +1,13 @@
 #include "plugins/av/source/mediainput.h"
 
+#include <algorithm>
 #include <array>
 #include <climits>
 #include <cstring>
 #include <utility>
 
 #include "plugins/av/source/avheaders.h"
+#include "plugins/av/source/boxes.h"
 #include "plugins/av/source/limits.h"
 
 namespace av {
@@ -68,27 +70,42 @@ std::string reasonOf(int code) {
     return lower(errorText(code));
 }
 
+// What the library reads from.
+struct Bytes {
+    std::unique_ptr<QvByteSource> source;
+    long long left = -1;  // the place of reading while bytes are left out; -1: they are read
+};
+
 int readBytes(void* opaque, std::uint8_t* to, int count) {
-    auto& source = *static_cast<QvByteSource*>(opaque);
+    auto& bytes = *static_cast<Bytes*>(opaque);
+    QvByteSource& source = *bytes.source;
+    if (bytes.left >= 0) {
+        const long long there = std::min<long long>(count, source.size() - bytes.left);
+        if (there <= 0) return AVERROR_EOF;
+        bytes.left += there;
+        return static_cast<int>(there);
+    }
     const std::size_t got = source.read(to, static_cast<std::size_t>(count));
     if (got > 0) return static_cast<int>(got);
     return source.failed() ? AVERROR(EIO) : AVERROR_EOF;
 }
 
 std::int64_t seekBytes(void* opaque, std::int64_t offset, int whence) {
-    auto& source = *static_cast<QvByteSource*>(opaque);
+    auto& bytes = *static_cast<Bytes*>(opaque);
+    QvByteSource& source = *bytes.source;
     const long long size = source.size();
     const bool known = size != QvByteSource::unknown;
     switch (whence & ~AVSEEK_FORCE) {
         case AVSEEK_SIZE: return known ? size : AVERROR(ENOSYS);
         case SEEK_SET: break;
-        case SEEK_CUR: offset += source.position(); break;
+        case SEEK_CUR: offset += bytes.left >= 0 ? bytes.left : source.position(); break;
         case SEEK_END:
             if (!known) return AVERROR(ENOSYS);
             offset += size;
             break;
         default: return AVERROR(EINVAL);
     }
+    if (bytes.left >= 0) return offset < 0 ? AVERROR(EINVAL) : bytes.left = offset;
     return source.seek(offset) ? offset : AVERROR(EIO);
 }
 
@@ -121,6 +138,25 @@ bool isEncrypted(const AVStream& stream) {
     const unsigned tag = stream.codecpar->codec_tag;
     return tag == MKTAG('e', 'n', 'c', 'v') || tag == MKTAG('e', 'n', 'c', 'a') ||
            av_stream_get_side_data(&stream, AV_PKT_DATA_ENCRYPTION_INIT_INFO, nullptr);
+}
+
+// Codecs for whose packets the library looks at no byte to say what they are.
+bool isKnownByTable(const AVCodecParameters& codec) {
+    switch (codec.codec_id) {
+        case AV_CODEC_ID_H264:
+        case AV_CODEC_ID_HEVC:
+        case AV_CODEC_ID_MPEG4:
+        case AV_CODEC_ID_PRORES:
+        case AV_CODEC_ID_DNXHD:
+        case AV_CODEC_ID_MJPEG:
+        case AV_CODEC_ID_DVVIDEO:
+        case AV_CODEC_ID_JPEG2000:
+        case AV_CODEC_ID_RAWVIDEO:
+        case AV_CODEC_ID_AAC: return true;
+        default: break;
+    }
+    if (codec.codec_type != AVMEDIA_TYPE_AUDIO) return codec.codec_type != AVMEDIA_TYPE_VIDEO;
+    return codec.codec_id >= AV_CODEC_ID_FIRST_AUDIO && codec.codec_id < AV_CODEC_ID_ADPCM_IMA_QT;
 }
 
 // Program and transport streams.
@@ -163,7 +199,7 @@ bool MediaBytes::seekable() const {
 }
 
 struct MediaInput::State {
-    std::unique_ptr<QvByteSource> source;
+    Bytes bytes;
     AVIOContext* io = nullptr;
     AVFormatContext* context = nullptr;
     PacketPtr found;  // of a seek: what the next read delivers
@@ -174,18 +210,29 @@ struct MediaInput::State {
         if (io) av_freep(&io->buffer);
         avio_context_free(&io);
     }
-    int open(const MediaBytes& bytes, const std::string& format);
+    int open(const MediaBytes& from, const std::string& format);
+    void takeBytes();
 };
 
-int MediaInput::State::open(const MediaBytes& bytes, const std::string& format) {
+// What the library has buffered is none of the file's.
+void MediaInput::State::takeBytes() {
+    if (bytes.left < 0) return;
+    bytes.source->seek(bytes.left);
+    bytes.left = -1;
+    io->buf_ptr = io->buf_end = io->buffer;
+    io->eof_reached = 0;
+    context->flags &= ~AVFMT_FLAG_NOPARSE;
+}
+
+int MediaInput::State::open(const MediaBytes& from, const std::string& format) {
     auto* buffer = static_cast<unsigned char*>(av_malloc(bufferBytes));
     if (!buffer) return AVERROR(ENOMEM);
-    io = avio_alloc_context(buffer, bufferBytes, 0, source.get(), readBytes, nullptr, seekBytes);
+    io = avio_alloc_context(buffer, bufferBytes, 0, &bytes, readBytes, nullptr, seekBytes);
     context = avformat_alloc_context();
     found.reset(av_packet_alloc());
     if (!io) av_free(buffer);
     if (!io || !context || !found) return AVERROR(ENOMEM);
-    io->seekable = source->seekable() ? AVIO_SEEKABLE_NORMAL : 0;
+    io->seekable = bytes.source->seekable() ? AVIO_SEEKABLE_NORMAL : 0;
     context->pb = io;
     context->flags |= AVFMT_FLAG_CUSTOM_IO;
     context->io_open = openNothing;
@@ -197,7 +244,7 @@ int MediaInput::State::open(const MediaBytes& bytes, const std::string& format) 
     context->protocol_whitelist = av_strdup("none");
     const AVInputFormat* forced = nullptr;
     if (!format.empty() && !(forced = av_find_input_format(format.c_str()))) return AVERROR_DEMUXER_NOT_FOUND;
-    const Any name = bytes.name().toString();
+    const Any name = from.name().toString();
     int result = avformat_open_input(&context, name.asString(""), forced, nullptr);
     if (result >= 0) result = avformat_find_stream_info(context, nullptr);
     return result;
@@ -221,11 +268,11 @@ std::unique_ptr<MediaInput> MediaInput::open(const MediaBytes& bytes, const std:
 bool MediaInput::openState(std::string& reason) {
     state_ = std::make_unique<State>();
     State& state = *state_;
-    state.source = bytes_->open(reason);
-    if (!state.source) return false;
+    state.bytes.source = bytes_->open(reason);
+    if (!state.bytes.source) return false;
     const int result = state.open(*bytes_, format_);
     if (result < 0) {
-        const std::string problem = state.source->failed() ? state.source->problem() : "";
+        const std::string problem = state.bytes.source->failed() ? state.bytes.source->problem() : "";
         reason = problem.empty() ? reasonOf(result) : problem;
         return false;
     }
@@ -254,8 +301,8 @@ MediaInput::Read MediaInput::read(AVPacket& packet) {
             av_packet_unref(&packet);
             continue;
         }
-        if (state_->source->failed()) {
-            failure_ = state_->source->problem();
+        if (state_->bytes.source->failed()) {
+            failure_ = state_->bytes.source->problem();
             return Read::failed;
         }
         const bool noMemory = result == AVERROR(ENOMEM);
@@ -267,7 +314,23 @@ MediaInput::Read MediaInput::read(AVPacket& packet) {
     }
 }
 
+bool MediaInput::leaveBytes() {
+    AVFormatContext& all = context();
+    Bytes& bytes = state_->bytes;
+    if (av_match_name("mp4", all.iformat->name) <= 0 || !bytes.source->seekable()) return false;
+    for (unsigned i = 0; i < all.nb_streams; ++i)
+        if (!isKnownByTable(*all.streams[i]->codecpar)) return false;
+    const long long at = bytes.source->position();
+    const bool table = isOneTable(*bytes.source);
+    if (!bytes.source->seek(at)) return false;
+    if (!table) return false;
+    bytes.left = at;
+    all.flags |= AVFMT_FLAG_NOPARSE;
+    return true;
+}
+
 bool MediaInput::rewind() {
+    state_->takeBytes();
     state_->hasFound = false;
     av_packet_unref(state_->found.get());
     // The library's reader of WavPack keeps the head of a block over a seek.

@@ -60,6 +60,11 @@ class MediaInput {
     // are never decoded. -1: of all streams.
     void selectOnly(int stream);
 
+    // Where the container has one table of all packets: from here to the next rewind packets come as they do
+    // else, but their bytes are not read from the file, and are anything. False where it has none, or where
+    // the library needs the bytes to say what the packets are.
+    bool leaveBytes();
+
     enum class Read { packet, end, failed };
     // The next packet, to be unreferenced by the caller. After `failed`, failure() is the reason.
     Read read(AVPacket& packet);

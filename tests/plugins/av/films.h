@@ -1,6 +1,8 @@
 // Small films made by the ffmpeg command, and what it says are their pictures.
 #pragma once
 
+#include <algorithm>
+#include <array>
 #include <string>
 #include <vector>
 
@@ -32,6 +34,22 @@ class Films : public testing::Test {
         const Outcome made = ffmpeg(words);
         EXPECT_EQ(made.status, 0) << made.err;
         return file;
+    }
+    // A copy of a MOV of one track with another display matrix: the quarters of its upper left corner, in the
+    // order of the file.
+    std::string turnedFilm(const std::string& film, const std::array<int, 4>& quarters) const {
+        std::string bytes = TempFolder::read(film);
+        const auto matrix = [](const std::array<int, 4>& m) {
+            std::string text;
+            for (const int number : {m[0] << 16, m[1] << 16, 0, m[2] << 16, m[3] << 16, 0, 0, 0, 1 << 30})
+                for (int shift = 24; shift >= 0; shift -= 8) text += static_cast<char>(number >> shift);
+            return text;
+        };
+        const std::string none = matrix({1, 0, 0, 1}), other = matrix(quarters);
+        const std::size_t at = bytes.rfind(none);  // that of the film is before it
+        EXPECT_NE(at, std::string::npos);
+        folder.write("turned.mov", bytes.replace(std::min(at, bytes.size()), none.size(), other));
+        return folder.file("turned.mov");
     }
     // Its pictures one after the other in that layout.
     std::string pictures(const std::string& film, const std::string& layout) const {

@@ -30,6 +30,40 @@ TEST_F(FilmsInTheTool, areShownAndTranscodedToTheirLastPicture) {
     EXPECT_EQ(picture.status, 0) << picture.err;
 }
 
+TEST_F(FilmsInTheTool, areTurnedUprightUnlessTheyAreWantedAsCoded) {
+    const std::string plain = film("plain.mov", {"-c:v", "mpeg4", "-aspect", "3:1"});
+    turnedFilm(plain, {0, 1, -1, 0});
+    const std::string upright = pictures(folder.file("turned.mov"), "yuv420p"),
+                      coded = pictures(plain, "yuv420p");
+    const std::size_t size = 96 * 64 * 3 / 2;
+    const struct {
+        Words words;
+        std::string expected;
+    } cases[] = {
+        {{"turned.mov"}, upright},
+        {{"turned.mov", "--no-rotate"}, coded},
+        {{"--cut", "4f-9f", "--cut", "30f-32f", "turned.mov"},
+         upright.substr(4 * size, 5 * size) + upright.substr(30 * size, 2 * size)},
+    };
+    for (const auto& c : cases) {
+        Words words = {"transcode", "-y", "-o", "out.i420"};
+        words.insert(words.end(), c.words.begin(), c.words.end());
+        const Outcome made = tarsel(words);
+        EXPECT_EQ(made.status, 0) << made.err;
+        EXPECT_TRUE(TempFolder::read(folder.file("out.i420")) == c.expected) << c.words.back();
+    }
+    EXPECT_EQ(tarsel({"transcode", "turned.mov", "-o", "kept.i420", "--save-task", "kept.xml"}).status, 0);
+    EXPECT_EQ(tarsel({"run", "-y", "kept.xml"}).status, 0);
+    EXPECT_TRUE(TempFolder::read(folder.file("kept.i420")) == upright);
+    EXPECT_THAT(tarsel({"info", "turned.mov"}).out,
+                testing::AllOf(HasSubstr("96x64"), HasSubstr("turned by 90 degrees")));
+    EXPECT_THAT(tarsel({"transcode", "--dry-run", "turned.mov", "-o", "plan.i420"}).out, HasSubstr("64x96"));
+    for (const auto& [option, width] : {std::pair{"--progress=none", 64}, std::pair{"--no-rotate", 96}}) {
+        EXPECT_EQ(tarsel({"frame", "turned.mov", option, "-y", "-o", "one.png"}).status, 0);
+        EXPECT_EQ(static_cast<unsigned char>(TempFolder::read(folder.file("one.png"))[19]), width) << option;
+    }
+}
+
 TEST_F(FilmsInTheTool, areUnknownWithoutThePlugIn) {
     film("film.mp4", {"-c:v", "mpeg4"});
     const Outcome o = tarsel({"--no-plugins", "info", "film.mp4"});

@@ -33,7 +33,7 @@ std::string bytesOf(const QvFrame& frame, int shift) {
 
 class FrameReaderOfFilms : public Films {
   protected:
-    std::unique_ptr<FrameReader> open(const std::string& film, int threads = 2) {
+    std::unique_ptr<FrameReader> open(const std::string& film, int threads = 2, bool upright = false) {
         bytes_ = std::make_unique<av::MediaBytes>(Any(film.c_str()));
         std::string reason;
         const auto input = av::MediaInput::open(*bytes_, "", reason);
@@ -41,15 +41,16 @@ class FrameReaderOfFilms : public Films {
         if (!input) return nullptr;
         const std::shared_ptr<const av::PacketIndex> index = av::PacketIndex::build(*input, reason);
         EXPECT_TRUE(index) << reason;
-        auto reader = index ? FrameReader::open(*bytes_, "", 0, index, threads, reason) : nullptr;
+        auto reader = index ? FrameReader::open(*bytes_, "", 0, index, {threads, upright}, reason) : nullptr;
         EXPECT_TRUE(reader) << reason;
         return reader;
     }
 
     // Every picture in order, then in any order, against what ffmpeg makes of the film.
-    void compare(const std::string& film, const std::string& layout, int shift, int frames) {
+    void compare(const std::string& film, const std::string& layout, int shift, int frames,
+                 bool upright = false) {
         SCOPED_TRACE(film);
-        const auto reader = open(film);
+        const auto reader = open(film, 2, upright);
         ASSERT_TRUE(reader);
         const std::string expected = pictures(film, layout);
         ASSERT_EQ(reader->format().frames, frames);
@@ -100,6 +101,33 @@ TEST_F(FrameReaderOfFilms, everyPictureIsTheSameInOrderAndAfterSeeks) {
     for (const auto& c : cases) {
         const std::string file = film(c.name, c.options);
         if (c.shift >= 0) compare(file, c.layout, c.shift, 50);
+    }
+}
+
+TEST_F(FrameReaderOfFilms, uprightPicturesAreTurnedAndMirroredExactly) {
+    const struct {
+        const char* codec;
+        const char* layout;
+        bool exact;  // a quarter turn of 4:2:2 is converted
+    } films[] = {{"mpeg4", "yuv420p", true}, {"prores_ks", "yuv422p10le", false}, {"png", "bgra", true}};
+    const int matrices[][4] = {{0, 1, -1, 0}, {-1, 0, 0, -1}, {0, -1, 1, 0}, {-1, 0, 0, 1},
+                               {1, 0, 0, -1}, {0, 1, 1, 0},   {0, -1, -1, 0}};
+    for (const auto& [codec, layout, exact] : films) {
+        const std::string plain =
+            film("plain.mov", {"-c:v", codec}, "testsrc2=size=98x62:rate=25:duration=0.2");
+        for (const auto& m : matrices) {
+            SCOPED_TRACE(std::string(codec) + " " + std::to_string(m[0]) + std::to_string(m[1]));
+            const std::string turned = turnedFilm(plain, {m[0], m[1], m[2], m[3]});
+            const bool quarter = m[0] == 0;
+            const auto reader = open(turned, 1, true);
+            ASSERT_TRUE(reader);
+            EXPECT_EQ(reader->format().width, quarter ? 62 : 98);
+            EXPECT_FALSE(reader->format().turn.any());
+            if (exact)
+                compare(turned, layout, 0, 5, true);
+            else
+                EXPECT_EQ(reader->read(), FrameReader::Read::picture);
+        }
     }
 }
 

@@ -1,0 +1,110 @@
+#include "plugins/av/decoder/filmlength.h"
+
+#include <algorithm>
+#include <cmath>
+#include <cstring>
+
+#include "plugins/av/index/packetindex.h"
+#include "plugins/av/source/avheaders.h"
+
+namespace av {
+
+namespace {
+
+// Containers whose header states the length of the film. Most are written by the clock of one stream, so
+// that the others may end a little earlier; some count samples.
+struct Stated {
+    const char* format;
+    double share, seconds;  // by which the film may be shorter
+};
+constexpr Stated stated[] = {{"matroska", 0.01, 1}, {"avi", 0.01, 1}, {"mxf", 0.01, 1}, {"mp3", 0.01, 1},
+                             {"flac", 0, 0.1},      {"aiff", 0, 0.1}, {"au", 0, 0.1}};
+
+}  // namespace
+
+FilmLength::FilmLength(const AVFormatContext& container, const PacketIndex& index, long long bytes)
+    : container_(container), index_(index), bytes_(bytes), cut_(!index.damage().empty() || endsEarly()) {}
+
+// The library has several names for one format.
+bool FilmLength::is(const char* format) const { return av_match_name(format, container_.iformat->name) > 0; }
+
+// Announced for a stream; 0 for unknown.
+double FilmLength::seconds(const AVStream& stream) const {
+    // Of AVI the library has a length that fits to the size of the file.
+    const bool pictures = stream.codecpar->codec_type == AVMEDIA_TYPE_VIDEO;
+    if (is("avi") && pictures && stream.nb_frames > 0)
+        return static_cast<double>(stream.nb_frames) * av_q2d(stream.time_base);
+    if (stream.duration != AV_NOPTS_VALUE)
+        return static_cast<double>(stream.duration) * av_q2d(stream.time_base);
+    if (container_.duration != AV_NOPTS_VALUE) return static_cast<double>(container_.duration) / AV_TIME_BASE;
+    return 0;
+}
+
+// Seconds from the first packet to the end of the last one.
+double FilmLength::present() const {
+    double first = 0, last = 0;
+    bool any = false;
+    for (unsigned i = 0; i < container_.nb_streams; ++i) {
+        const double unit = av_q2d(container_.streams[i]->time_base);
+        for (const IndexedPacket& packet : index_.packets(static_cast<int>(i))) {
+            const std::int64_t time = packet.pts != AV_NOPTS_VALUE ? packet.pts : packet.dts;
+            if (time == AV_NOPTS_VALUE) continue;
+            const double start = static_cast<double>(time) * unit;
+            first = any ? std::min(first, start) : start;
+            last = std::max(any ? last : start, start + packet.duration * unit);
+            any = true;
+        }
+    }
+    return any ? last - first : 0;
+}
+
+bool FilmLength::endsEarly() const {
+    const auto* const row =
+        std::find_if(std::begin(stated), std::end(stated), [&](const Stated& one) { return is(one.format); });
+    if (row == std::end(stated) || container_.duration == AV_NOPTS_VALUE) return false;
+    if (container_.duration_estimation_method != AVFMT_DURATION_FROM_STREAM) return false;
+    double length = static_cast<double>(container_.duration) / AV_TIME_BASE;
+    for (unsigned i = 0; i < container_.nb_streams; ++i)
+        if (container_.streams[i]->codecpar->codec_type == AVMEDIA_TYPE_VIDEO)
+            length = std::max(length, seconds(*container_.streams[i]));
+    const double there = present();
+    return there > 0 && length > there * (1 + row->share) + row->seconds;
+}
+
+// Containers of tables of samples say how many packets there are. Of those in fragments the library has the
+// tables of all fragments that it has seen.
+long long FilmLength::missingPackets(const AVStream& stream) const {
+    if (!is("mp4")) return 0;
+    const auto there = static_cast<long long>(index_.packets(stream.index).size());
+    const long long listed = avformat_index_get_entries_count(&stream);
+    return std::max<long long>({listed - there, stream.nb_frames - there, 0});
+}
+
+// Uncompressed pictures lie one after the other to the end of the file.
+bool FilmLength::endsWithinPicture(const AVStream& stream) const {
+    const auto& packets = index_.packets(stream.index);
+    if (!is("yuv4mpegpipe") || packets.size() < 2) return false;
+    const std::int64_t stride = packets[1].position - packets[0].position;
+    return stride > 0 && packets.back().position + stride < bytes_;
+}
+
+// Where the library fits the length to the size of the file, but keeps the number.
+long long FilmLength::announcedSamples(const AVStream& stream) const {
+    const bool plain = av_get_bits_per_sample(stream.codecpar->codec_id) > 0;
+    return is("caf") && plain ? stream.nb_frames : 0;
+}
+
+bool FilmLength::isCut(const AVStream& stream) const {
+    return cut_ || missingPackets(stream) > 0 || endsWithinPicture(stream) || announcedSamples(stream) > 0;
+}
+
+long long FilmLength::announced(const AVStream& stream, double rate, long long present) const {
+    const double units = seconds(stream) * rate;
+    long long whole = units > 0 && units < 1e15 ? std::llround(units) : 0;
+    whole = std::max(whole, announcedSamples(stream));
+    const bool pictures = stream.codecpar->codec_type == AVMEDIA_TYPE_VIDEO;
+    if (pictures && whole <= present) whole = present + missingPackets(stream) + endsWithinPicture(stream);
+    return whole;
+}
+
+}  // namespace av
