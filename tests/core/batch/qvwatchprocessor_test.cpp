@@ -7,6 +7,7 @@
 #include "core/preset/qvprofile.h"
 #include "tests/support/checks.h"
 #include "tests/support/engine.h"
+#include "tests/support/failing_codecs.h"
 #include "tests/support/wav_bytes.h"
 
 namespace {
@@ -184,6 +185,28 @@ TEST_F(QvWatchProcessorTest, TargetsFailAlone) {
     EXPECT_TRUE(log.contains("transcoded 1 files, failed 3 files"));
     EXPECT_EQ(filesIn("w"), Texts{});
     EXPECT_EQ(filesIn("z"), Texts{"a.avi"});
+}
+
+TEST_F(QvWatchProcessorTest, ATargetThatThrowsInMidRunFailsAlone) {
+    struct Failing : QvWatchProcessor {
+        int nameOutput(QvEncodePipe& pipe, const QvWatchTask& task, int target, const Any& file) override {
+            outputs.failAt = target == 0 ? "rawaenc.write" : "";
+            return QvWatchProcessor::nameOutput(pipe, task, target, file);
+        }
+        FailingOutputs outputs;
+    } processor;
+    const std::string name = wav("a.wav", 1), before = TempFolder::read(name);
+    for (const auto how : {FailingOutputs::noMemory, FailingOutputs::assertion}) {
+        processor.outputs.how = how;
+        ASSERT_EQ(input_.open(narrow(folder_.file("in")), QvWatchFolderInput::keep), 0);
+        LogCapture log;
+        EXPECT_EQ(processor.process(input_, taskOf({avi("w"), avi("z")})), -1);
+        EXPECT_TRUE(log.contains("    Transcoding error", QvLogMask::error));
+        EXPECT_TRUE(log.contains("transcoded 1 files, failed 1 files"));
+        EXPECT_GT(fs::file_size(folder_.file("z/a.avi")), 96000u);
+        EXPECT_EQ(TempFolder::read(name), before);
+        fs::remove(folder_.file("z/a.avi"));
+    }
 }
 
 TEST_F(QvWatchProcessorTest, NamesOutputs) {

@@ -59,6 +59,14 @@ class Batch : public Tool {
         return at == std::string::npos ? '-' : text[at + 2];
     }
 
+    static bool comesToState(pid_t process, bool stopped) {
+        for (int i = 0; i < 10000; ++i) {
+            if ((stateOf(process) == 'T') == stopped) return true;
+            usleep(1000);
+        }
+        return false;
+    }
+
     // A job that runs until it is stopped, and well beyond any test.
     static Words endless(const std::string& output) {
         return {
@@ -256,11 +264,7 @@ TEST_F(Batch, AStoppedRunStopsItsTasks) {
     const pid_t task = nextRunner(run);
     ASSERT_GT(task, 0);
     const auto become = [&](bool stopped) {
-        for (int i = 0; i < 10000; ++i) {
-            if ((stateOf(task) == 'T') == stopped && (stateOf(run.id()) == 'T') == stopped) return true;
-            usleep(1000);
-        }
-        return false;
+        return comesToState(task, stopped) && comesToState(run.id(), stopped);
     };
     run.signal(SIGTSTP);
     EXPECT_TRUE(become(true));
@@ -273,6 +277,26 @@ TEST_F(Batch, AStoppedRunStopsItsTasks) {
     run.signal(SIGTERM);
     run.signal(SIGCONT);
     EXPECT_EQ(run.finish().status, 143);
+    EXPECT_EQ(stateOf(task), '-');
+}
+
+// The run itself goes on, so that its keys work; the tasks are what stands still.
+TEST_F(Batch, KeysPauseTheTasks) {
+    add(endless("long.raw"));
+    ProcessOptions screen = here();
+    screen.terminal = true;
+    Process run(words({"batch", "l.xml", "run"}), screen);
+    ASSERT_TRUE(run.waitFor("p q"));
+    pid_t task = 0;
+    for (int i = 0; i < 10000 && task == 0; ++i, usleep(1000)) task = runner();
+    ASSERT_GT(task, 0);
+    for (const bool stopped : {true, false, true}) {
+        run.type("p");
+        EXPECT_TRUE(comesToState(task, stopped));
+        EXPECT_NE(stateOf(run.id()), 'T');
+    }
+    run.type("q");
+    EXPECT_EQ(run.finish().status, 130);
     EXPECT_EQ(stateOf(task), '-');
 }
 

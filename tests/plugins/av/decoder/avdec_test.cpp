@@ -233,4 +233,15 @@ TEST_F(FilmsInTheTool, keepTheirColours) {
     }
 }
 
+TEST_F(FilmsInTheTool, thatArriveAreMadeIntoOthers) {
+    std::filesystem::create_directory(folder.path() / "in");
+    film("in/one.mkv", {"-c:v", "mpeg4"});
+    film("in/two.ts", {"-c:v", "mpeg2video"});
+    const Outcome o =
+        tarsel({"watch", "in", "--once", "--settle", "0.2", "--preset", "H.264 for the web:out"});
+    EXPECT_EQ(o.status, 0) << o.err;
+    for (const char* made : {"out/one.mp4", "out/two.mp4"})
+        EXPECT_EQ(pictures(folder.file(made), "yuv420p").size(), 50u * 96 * 64 * 3 / 2) << made;
+}
+
 }  // namespace
