@@ -108,7 +108,8 @@ void fitToPlace(QvEncodePipe& pipe, const JobPlan& plan, bool acceptPartial) {
     if (raw) muxer.setParam("exactName", toStream ? 1 : 0);
     // What was written to a stream can't be gone back to. A file is said to be one: a multiplexer that looks
     // by itself, and can't, would take it for a pipe.
-    if (!raw && (toStream || isOpen(muxer, "seekable"))) setOptional(muxer, "seekable", toStream ? 0 : 1);
+    if (!raw && (toStream || (plan.output.isFiles() && isOpen(muxer, "seekable"))))
+        setOptional(muxer, "seekable", toStream ? 0 : 1);
     setTags(pipe, plan);
     if (!raw || !toStream || acceptPartial) return;
     for (const PlannedStream& stream : plan.streams)
