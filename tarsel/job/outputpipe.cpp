@@ -17,6 +17,15 @@ void setOptional(QvCodec& codec, const char* name, const Any& value) {
     }
 }
 
+// Whether a parameter is left to the multiplexer.
+bool isOpen(const QvCodec& codec, const char* name) {
+    try {
+        return codec.getParam(name) == Any(-1);
+    } catch (const QvParamException&) {  // not one of its parameters
+        return false;
+    }
+}
+
 void setStreamOptional(QvMuxer& muxer, const PlannedStream& stream, const char* name, const Any& value) {
     try {
         muxer.setStreamParam(stream.type, stream.number, name, value);
@@ -97,8 +106,10 @@ void fitToPlace(QvEncodePipe& pipe, const JobPlan& plan, bool acceptPartial) {
     QvMuxer& muxer = *pipe.getMuxer();
     const bool raw = std::string_view(muxer.name()) == "rawmux";
     if (raw) muxer.setParam("exactName", toStream ? 1 : 0);
-    // What was written there can't be gone back to.
-    if (!raw && toStream) setOptional(muxer, "seekable", 0);
+    // What was written to a stream can't be gone back to. A file is said to be one: a multiplexer that looks
+    // by itself, and can't, would take it for a pipe.
+    if (!raw && (toStream || (plan.output.isFiles() && isOpen(muxer, "seekable"))))
+        setOptional(muxer, "seekable", toStream ? 0 : 1);
     setTags(pipe, plan);
     if (!raw || !toStream || acceptPartial) return;
     for (const PlannedStream& stream : plan.streams)

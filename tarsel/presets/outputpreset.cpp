@@ -84,8 +84,20 @@ std::unique_ptr<QvEncodePipe> OutputPreset::makePipe(const char* muxer) const {
     return pipe;
 }
 
+// The first encoder of a built-in preset whose streams the multiplexer takes; empty where it does not say.
+std::string OutputPreset::usualEncoder(const QvMuxer& muxer, int type) const {
+    const QvModule* const module = qv_registry()->module(muxer.name());
+    const Any taken = module && !preset_.isCustom() ? module->getAttr("compatEncoders") : Any();
+    if (!taken.isVector()) return "";
+    const AnyVector allowed = preset_.getCompatible(muxer.name(), encoderKind(type));
+    for (const Any& name : allowed)
+        if (taken.asVector().contains(name)) return name.asString("");
+    return "";
+}
+
 QvEncoder& OutputPreset::addStream(QvEncodePipe& pipe, int type) const {
-    const std::string& encoder = encoders_.of(type);
+    const std::string& chosen = encoders_.of(type);
+    const std::string encoder = chosen.empty() ? usualEncoder(*pipe.getMuxer(), type) : chosen;
     const int number = pipe.addStream(type, encoder.empty() ? Any() : Any(encoder.c_str()));
     if (number < 0)
         throw failure(Msg::presetNoStream,

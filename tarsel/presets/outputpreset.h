@@ -57,6 +57,7 @@ class OutputPreset {
     AnyDict storedCodec(int type, int number = 0) const;
 
   private:
+    std::string usualEncoder(const QvMuxer& muxer, int type) const;
     bool says(const QvCodec& encoder, int type, int number, const char* name, const char* range,
               bool fitted) const;
 

@@ -25,6 +25,8 @@ RAW = ["--raw", "size=64x48,pixel=I420,rate=25"]
 CLIP = ["clip.yuv", *RAW]
 EFFECTS = ["--subtitles", "talk.srt", "--logo", "mark.png@4,4", "--timecode", "--fade", "0.1", "--crop", "60x40",
            "--flip"]
+# Matroska has a random number of its own otherwise.
+BITEXACT = ["--muxer", "mkvmux:avOptions=fflags=+bitexact"]
 
 # Where the result names the decoder, no other one may take a file that the first could not read.
 JOBS = [
@@ -70,6 +72,10 @@ JOBS = [
     Job("scope", ["scope", *CLIP, "-o", "levels.png", "-y"],
         ["scope", *CLIP, "--at", "0.4", "-o", "levels.png", "-y"]),
     Job("film", ["transcode", "film.y4m", "-o", "film.yuv", "-y"], ["transcode", *CLIP, "-o", "film.yuv", "-y"]),
+    Job("mp4", card("--vcodec", "h264:preset=ultrafast", "--threads", "1", "-o", "card.mp4"),
+        card("--vcodec", "h264:preset=ultrafast", "--threads", "1", "-o", "card.mp4", length=0.28)),
+    Job("mkv", card(*BITEXACT, "--vcodec", "ffv1", "--acodec", "flac", "--threads", "1", "-o", "card.mkv"),
+        card(*BITEXACT, "--vcodec", "ffv1", "--acodec", "flac", "--threads", "1", "-o", "card.mkv", length=0.28)),
     Job("captions", ["captions", "one.scc", "--json"], stdout=True),
     Job("info", ["--no-plugins", "info", "in.wav", "talk.srt", "--json"], stdout=True),
 ]

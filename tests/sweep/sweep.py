@@ -31,6 +31,7 @@ import options
 import outputs
 import perturb
 import plugins
+import presets
 import readers
 import signals
 from runner import Sweep
@@ -42,7 +43,7 @@ ATTACKS = {  # kind: the unit that has its cases, and how many of them --quick r
     "rename": (faults, 20), "sync": (faults, 20), "thread": (faults, 15), "make": (faults, 10), "lock": (faults, 10),
     "kill": (kills, 60), "signal": (signals, 40), "hostile": (hostile, 100), "option": (options, 60),
     "output": (outputs, 1000), "limit": (limits, 20), "plugin": (plugins, 1000), "batch": (batches, 2), "batchkill": (batches, 25),
-    "watch": (feeding, 2),
+    "watch": (feeding, 2), "preset": (presets, 10),
 }
 
 

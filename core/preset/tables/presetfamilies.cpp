@@ -31,6 +31,7 @@ constexpr ModuleRow aac = {"aacaenc", "rawaenc"};
 constexpr ModuleRow mobile = {"aacaenc", "amraenc", "rawaenc"};
 constexpr ModuleRow broad = {"aacaenc", "ddproaenc", "ddplusproaenc", "mpegpcmenc", "mpegaenc", "rawaenc"};
 constexpr ModuleRow camera = {"ddproaenc", "ddplusproaenc", "mpegpcmenc", "rawaenc"};
+constexpr ModuleRow dolby = {"ddproaenc", "ddplusproaenc", "ddaenc", "mpegaenc", "aacaenc", "rawaenc"};
 constexpr ModuleRow layers = {"mpegaenc", "mpegpcmenc", "aacaenc", "ddproaenc", "ddplusproaenc", "rawaenc"};
 constexpr ModuleRow dummy = {"dummyaenc"};
 constexpr ModuleRow dummyOrPcm = {"dummyaenc", "mpegpcmenc"};
@@ -79,9 +80,9 @@ constexpr PresetFamily families[] = {
                                         {named("3GP_MPEG4"),                 "3GP MPEG-4"},
                                         {named("MPEG4_HD"),                  "MPEG-4 HD"},
                                         {named("MPEG4_SD"),                  "MPEG-4 SD"}}},
-    {h264,     any,        ts,         {{named("BD_H264_HDMV"),              "BD H.264 High Resolution"},
+    {h264,     camera,     ts,         {{named("BD_H264_HDMV"),              "BD H.264 High Resolution"},
                                         {named("BD_H264"),                   "BD H.264 Low Resolution"}}},
-    {mpeg,     any,        ts,         {{named("BD_MPEG_HDMV"),              "BD MPEG-2 High Resolution"},
+    {mpeg,     camera,     ts,         {{named("BD_MPEG_HDMV"),              "BD MPEG-2 High Resolution"},
                                         {named("BD_MPEG"),                   "BD MPEG-2 Low Resolution"}}},
     {vc1,      any,        ts,         {{named("BD_VC1_HDMV"),               "BD VC-1 High Resolution"},
                                         {named("BD_VC1"),                    "BD VC-1 Low Resolution"}}},
@@ -138,10 +139,10 @@ constexpr PresetFamily families[] = {
     {h264,     any,        mxf,        {{named("AVCINTRA_50"),               "AVC-Intra 50"},
                                         {named("AVCINTRA_100"),              "AVC-Intra 100"}}},
     {mpeg,     any,        ts,         {{named("DTV_DVB_SD"),                "DVB SD"},
-                                        {named("DTV_DVB_HD"),                "DVB HD"},
-                                        {named("DTV_ATSC_HD"),               "ATSC HD"},
-                                        {named("DTV_ATSC_SD"),               "ATSC SD"},
-                                        {named("HDV_HD1"),                   "HDV HD1"},
+                                        {named("DTV_DVB_HD"),                "DVB HD"}}},
+    {mpeg,     dolby,      ts,         {{named("DTV_ATSC_HD"),               "ATSC HD"},
+                                        {named("DTV_ATSC_SD"),               "ATSC SD"}}},
+    {mpeg,     any,        ts,         {{named("HDV_HD1"),                   "HDV HD1"},
                                         {named("HDV_HD2"),                   "HDV HD2"}}},
     {raw,      samples,    elementary, {{named("RAW"),                       "RAW/YUV"}}},
     {raw,      samples,    avi,        {{named("AVI_RAW"),                   "Uncompressed AVI"}}},

@@ -19,7 +19,7 @@ struct MuxerModule {
 // clang-format off
 inline constexpr auto muxerModules = std::to_array<MuxerModule>({
     {"mp4mux", "MPEG-4 file multiplexer", "MP4", "mp4 m4v m4a 3gp mov",
-     "h264venc h265venc av1venc mpegvenc mpeg4venc aacaenc mp3aenc ddaenc ddproaenc ddplusproaenc flacaenc opusaenc"},
+     "h264venc h265venc av1venc mpegvenc mpeg4venc aacaenc mp3aenc ddaenc ddproaenc ddplusproaenc flacaenc opusaenc mpegpcmenc"},
     {"movmux", "QuickTime file multiplexer", "QuickTime", "mov",
      "h264venc h265venc mpegvenc mpeg4venc vc3venc dvvenc dv100venc mj2kvenc proresvenc rawvenc aacaenc mp3aenc ddaenc ddproaenc ddplusproaenc mpegpcmenc rawaenc"},
     {"mkvmux", "Matroska multiplexer", "Matroska", "mkv mka",

@@ -4,9 +4,11 @@
 #include <array>
 #include <cstdlib>
 #include <cstring>
+#include <string_view>
 
 #include "core/engine/qvutil.h"
 #include "core/media/qvpcm.h"
+#include "core/preset/qvprofile.h"
 #include "plugins/av/encode/libraryoptions.h"
 #include "plugins/av/source/soundlayout.h"
 
@@ -133,6 +135,14 @@ int setOptionText(S& s, const Any& value) {
     return QvStatus::ok;
 }
 
+// The video discs have the rate of audio discs.
+int setProfile(S& s, const Any& value) {
+    if (!qvparam::convert(value, s.profile)) return QvStatus::invalidParam;
+    const std::string_view symbol = qvProfileToSym(s.profile);
+    if ((symbol == "VCD" || symbol == "SVCD") && holds(s.codec->rates, 44100)) s.samplerate = 44100;
+    return QvStatus::ok;
+}
+
 void bitrateRange(C s, Any& value) {
     AnyDict row("type", static_cast<int>(QvBitrate::cbr));
     row.set("range", s.codec->kilobits.empty() ? AnyVector(static_cast<int>(bitsPerSecond(s)))
@@ -143,7 +153,10 @@ void bitrateRange(C s, Any& value) {
 }
 
 const QvParamRow<S> table[] = {
-    {.name = "profile", .member = &S::profile, .help = "number of a preset"},
+    {.name = "profile",
+     .member = Access{setProfile, [](C s, Any& v) { v = s.profile; }},
+     .help = "number of a preset",
+     .type = Any::Int32},
     {.name = "samplerate",
      .member = Access{setRate, [](C s, Any& v) { v = s.samplerate; }},
      .flags = qvParamStored,

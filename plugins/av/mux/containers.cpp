@@ -43,7 +43,7 @@ static_assert(codecRows.size() == static_cast<std::size_t>(MuxCodec::count));
 
 constexpr std::uint32_t everySound = codecBits(aac, mp2, mp3, ac3, eac3, flac, opus, vorbis, pcm);
 constexpr std::uint32_t everything = (1u << static_cast<int>(MuxCodec::count)) - 1;
-constexpr std::uint32_t mp4Codecs = codecBits(h264, hevc, av1, vp9, mpeg1, mpeg2, mpeg4, mjpeg, jpeg2000, aac, mp3, ac3, eac3, flac, opus, vorbis);
+constexpr std::uint32_t mp4Codecs = codecBits(h264, hevc, av1, vp9, mpeg1, mpeg2, mpeg4, mjpeg, jpeg2000, aac, mp3, ac3, eac3, flac, opus, vorbis, pcm);
 constexpr std::uint32_t movCodecs = codecBits(h264, hevc, mpeg2, mpeg4, dnxhd, dv, jpeg2000, prores, mjpeg, raw, aac, mp3, ac3, eac3, pcm);
 
 // In the order of muxerModules.

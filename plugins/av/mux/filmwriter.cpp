@@ -98,16 +98,31 @@ bool FilmWriter::beginIfReady() {
 
 void FilmWriter::chooseFormat() {
     const auto all = [this](auto is) { return std::all_of(tracks_.begin(), tracks_.end(), is); };
+    const auto isNoPcm = [](const MuxTrack& track) { return track.codec().codec != MuxCodec::pcm; };
     const auto old = [](const MuxTrack& track) {
         return track.codec().codec == MuxCodec::mpeg1 || track.codec().codec == MuxCodec::mp2;
     };
+    // The library has PCM for QuickTime only, which readers of MP4 know.
+    if (job_.format == std::string_view("mp4") && !all(isNoPcm)) {
+        qv_log()->warning("'%s' has the form of QuickTime, as MP4 can't be written with PCM",
+                          job_.name.c_str());
+        job_.format = "mov";
+    }
     if (job_.container->silent && all(std::mem_fn(&MuxTrack::video))) job_.format = job_.container->silent;
     if (job_.container->mpeg1 && all(old)) job_.format = job_.container->mpeg1;
+}
+
+// The library joins no sound with 720 lines of DVCPRO HD, and finds out at the second picture.
+bool FilmWriter::canJoin() {
+    if (job_.format != std::string_view("dv") || tracks_.front().parameters().height != 720) return true;
+    return fail(std::string(job_.container->module().displayName) +
+                " does not hold DVCPRO HD of 720 lines with sound, but AVI and MXF do");
 }
 
 bool FilmWriter::begin() {
     AVFormatContext* made = nullptr;
     chooseFormat();
+    if (!canJoin()) return false;
     int result = avformat_alloc_output_context2(&made, nullptr, job_.format, nullptr);
     film_.reset(made);
     if (result < 0) return failWith("the libraries do not have it", result);

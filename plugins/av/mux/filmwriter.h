@@ -79,6 +79,7 @@ class FilmWriter {
 
     bool beginIfReady();
     void chooseFormat();
+    bool canJoin();
     bool begin();
     bool addStream(MuxTrack& track);
     void setOptions(AVDictionary** options);
