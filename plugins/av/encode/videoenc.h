@@ -50,6 +50,7 @@ class VideoEnc : public QvVideoEncoder {
 
     int fail(const std::string& why);
     std::string prepare();
+    std::string refusal(int code) const;
     std::string configure(AVPixelFormat layout);
     std::string configureRate();
     std::string configurePass();

@@ -41,6 +41,12 @@ TEST_F(FilmJobs, areWhatTheirOptionsSay) {
          "size=96x64",
          {"--vcodec", "h265venc:avOptions=x265-params=aq-mode=1", "--bitrate", "300k", "--two-pass"},
          "codec_name=hevc"},
+        {"e.mxf", "size=1920x1080", {"--vcodec", "vc3venc", "--rate", "25i"}, "field_order=tt"},
+        {"f.mp4",
+         "size=96x64",
+         {"--vcodec", "h264venc:codecProfile=baseline", "--muxer",
+          "mp4mux:avOptions=movflags=+frag_keyframe"},
+         "profile=Constrained Baseline"},
     };
     for (const auto& row : rows) {
         SCOPED_TRACE(row.name);
@@ -77,7 +83,12 @@ TEST_F(FilmJobs, areRefusedWithTheEncodersOwnReason) {
         Words options;
         const char* why;
     } rows[] = {
-        {{"--vcodec", "h264venc:avOptions=max_pixels=1", "-o", "x.mkv"}, "does not take these settings"},
+        {{"--vcodec", "h264venc:avOptions=max_pixels=1", "-o", "x.mkv"}, "these settings: 96x64 I420, 25p"},
+        {{"--vcodec", "h264venc:codecProfile=highest", "-o", "x.mkv"}, "can't take this value"},
+        {{"--vcodec", "h264venc", "--size", "95x63", "-o", "x.mkv"}, "multiples of 2, not 95x63"},
+        {{"--vcodec", "vc3venc", "--size", "720x576", "--rate", "25i", "-o", "x.mkv"}, "--rate 25i"},
+        {{"--muxer", "mp4mux:avOptions=movflags=+faststart", "-o", "x.mp4"}, "parameter 'fastStart'"},
+        {{"--vcodec", "vc3venc", "--size", "256x120", "--muxer", "mxfmux:seekable=0", "-o", "x.mxf"}, "pipe"},
         {{"--vcodec", "mpeg4venc:avOptions=threads=100000", "-o", "x.mkv"}, "own parameters decide"},
     };
     for (const auto& row : rows) {
