@@ -24,7 +24,8 @@ enum : unsigned {
     borrows = 32,     // copies a picture before it returns
     statsText = 64,   // statistics of a first pass are a text that the library hands over
     statsFile = 128,  // ... or files that it writes
-    pixelAspect = 256
+    pixelAspect = 256,
+    keepsForm = 512  // for masters and archives: takes the form that the input has
 };
 }
 

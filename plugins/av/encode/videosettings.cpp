@@ -274,6 +274,7 @@ const Row commonRows[] = {
     {"accelerationType", {}, qvParamIgnored},
     {"selectedFOURCC", Access{nullptr, [](C s, Any& v) { v = static_cast<int>(s.type); }}},
     {"allowedTypes", Access{nullptr, allowedTypes}},
+    {"keepsForm", Access{nullptr, [](C s, Any& v) { v = s.codec->has(VideoTrait::keepsForm) ? 1 : 0; }}},
     {"sizeRange", Access{nullptr, sizeRange}},
     {"framerateRange", Access{nullptr, framerateRange}},
     {"aspectRange", Access{nullptr, [](C, Any& v) { v = AnyDict("min", 0.1, "max", 10.0); }}},

@@ -3,6 +3,7 @@
 #include <string_view>
 #include <utility>
 
+#include "tarsel/presets/encoderforms.h"
 #include "tarsel/presets/ranges.h"
 #include "tarsel/source/source.h"
 #include "tarsel/words/messages.h"
@@ -128,6 +129,8 @@ void PresetPlanner::settle() {
         else
             checkSoundRanges(preset, encoder, stream.sound.samplerate, stream.sound.channels,
                              stream.sound.bits);
+        if (stream.isVideo() && !options_.encoders.sets("type"))
+            takeForm(encoder, stream.picture.fourcc, !effects_.pixel.empty());
         setFormat(encoder, stream);
         encoder.store(stream.codec);
     }
