@@ -70,7 +70,7 @@ TEST_F(FilmJobs, keepTheFormOfTheirPictures) {
     } rows[] = {
         {"yuv420p", "ffv1venc", "a.mkv", "yuv420p"},     {"yuv422p", "ffv1venc", "b.mkv", "yuv422p"},
         {"yuv420p10", "ffv1venc", "c.mkv", "yuv420p16"}, {"yuv422p10", "ffv1venc", "d.mkv", "yuv422p16"},
-        {"bgra", "ffv1venc", "e.mkv", "bgra"},           {"gbrp16", "ffv1venc", "f.mkv", "gbrap16"},
+        {"bgra", "ffv1venc", "e.mkv", "bgra"},           {"rgba64", "ffv1venc", "f.mkv", "gbrap16"},
         {"yuv422p10", "vc3venc", "g.mov", "yuv422p10"},  {"yuv420p10", "h264venc", "h.mp4", "yuv420p"},
     };
     for (const auto& row : rows) {
