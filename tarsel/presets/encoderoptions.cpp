@@ -94,6 +94,10 @@ std::string EncoderOptions::text(int type) const {
     return joined(parts);
 }
 
+bool EncoderOptions::sets(std::string_view name) const {
+    return std::any_of(video.begin(), video.end(), [name](const auto& set) { return set.first == name; });
+}
+
 void EncoderOptions::check() const {
     if (!crf.empty() && !bitrate.empty()) throw failure(Msg::optionsExclude, {"--crf", "--bitrate"});
     if (!crf.empty() && twoPass) throw failure(Msg::optionsExclude, {"--crf", "--two-pass"});

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <string>
+#include <string_view>
 #include <utility>
 #include <vector>
 
@@ -17,6 +18,8 @@ struct EncoderOptions {
     std::string text(int type) const;
     // Throws Failure (usage) for options that exclude each other.
     void check() const;
+
+    bool sets(std::string_view name) const;  // of the encoders of the picture, by --vcodec
 
     std::string crf, bitrate, audioBitrate;
     bool twoPass = false;

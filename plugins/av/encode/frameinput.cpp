@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cstdint>
 #include <cstring>
+#include <utility>
 
 #include "core/measure/fourcc.h"
 #include "core/media/qvframe.h"
@@ -30,7 +31,7 @@ constexpr Layouts layoutsOf[] = {
     {QvFourcc::Y216, AV_PIX_FMT_NONE, AV_PIX_FMT_YUV422P10LE, AV_PIX_FMT_YUV422P12LE, AV_PIX_FMT_YUV422P16LE},
     {QvFourcc::BGR4, AV_PIX_FMT_BGR0, AV_PIX_FMT_NONE, AV_PIX_FMT_NONE, AV_PIX_FMT_NONE},
     {QvFourcc::BGRA, AV_PIX_FMT_BGRA, AV_PIX_FMT_NONE, AV_PIX_FMT_NONE, AV_PIX_FMT_NONE},
-    {QvFourcc::b64a, AV_PIX_FMT_BGRA64LE, AV_PIX_FMT_NONE, AV_PIX_FMT_NONE, AV_PIX_FMT_NONE},
+    {QvFourcc::b64a, AV_PIX_FMT_BGRA64LE, AV_PIX_FMT_NONE, AV_PIX_FMT_NONE, AV_PIX_FMT_RGBA64LE},
 };
 
 // What the pixels of a form are put into: the wanted layout where that needs no arithmetic on neighbours.
@@ -93,6 +94,14 @@ void copyWords(const QvFrame& from, int plane, AVFrame& to, int width, int rows,
             out[x] = narrow(value);
         }
         if (there > 0 && there < width) out[there] = out[there - 1];
+    }
+}
+
+// Of pixels of four words; libswscale does not keep all bits of these.
+void exchangeRedAndBlue(AVFrame& frame) {
+    for (int y = 0; y < frame.height; ++y) {
+        auto* const row = rowOf<Word>(frame, 0, y);
+        for (int x = 0; x < frame.width; ++x) std::swap(row[4 * x], row[4 * x + 2]);
     }
 }
 
@@ -207,7 +216,10 @@ void FrameInput::unpack(const QvFrame& from, AVFrame& to) const {
             separate<std::uint8_t>(from, to, width_, height_, [](std::uint8_t value) { return value; });
             break;
         case QvFourcc::Y216: separate<Word>(from, to, width_, height_, narrow); break;
-        case QvFourcc::b64a: copyBytes(from, 0, to, 8 * width_, height_); break;
+        case QvFourcc::b64a:
+            copyBytes(from, 0, to, 8 * width_, height_);
+            if (to.format == AV_PIX_FMT_RGBA64LE) exchangeRedAndBlue(to);
+            break;
         default: copyBytes(from, 0, to, 4 * width_, height_); break;
     }
 }

@@ -6,7 +6,7 @@
 //     YUYV    4:2:2, 8 bits       taking the pairs apart
 //     Y216    4:2:2, 10 bits...   both
 //     BGR4    BGR0, BGRA          rows
-//     b64a    BGRA64              rows
+//     b64a    BGRA64, RGBA64      rows
 //
 // An encoder of another layout gets that one by libswscale.
 #pragma once

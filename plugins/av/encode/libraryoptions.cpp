@@ -30,7 +30,7 @@ bool contains(std::span<const std::string_view> words, std::string_view text) {
 }
 
 bool namesFile(std::string_view name, std::string_view value) {
-    return contains(filed, name) || (isParameters(name) && contains(filed, value));
+    return (name != "profile" && contains(filed, name)) || (isParameters(name) && contains(filed, value));
 }
 
 bool isOwned(std::string_view name, std::string_view value) {

@@ -24,19 +24,21 @@ constexpr VideoForm x265Forms[] = {{I420, AV_PIX_FMT_YUV420P},
                                    {BGR4, AV_PIX_FMT_YUV444P}};
 constexpr VideoForm aomForms[] = {{I420, AV_PIX_FMT_YUV420P}, {W016, AV_PIX_FMT_YUV420P10LE}};
 constexpr VideoForm plainForms[] = {{I420, AV_PIX_FMT_YUV420P}};
-constexpr VideoForm mpeg2Forms[] = {{I420, AV_PIX_FMT_YUV420P}, {YUYV, AV_PIX_FMT_YUV422P}};
+constexpr VideoForm mpeg2Forms[] = {{I420, AV_PIX_FMT_YUV420P}, {YUYV, AV_PIX_FMT_YUV422P, "422"}};
 constexpr VideoForm dnxForms[] = {{YUYV, AV_PIX_FMT_YUV422P},
                                   {Y216, AV_PIX_FMT_YUV422P10LE, "dnxhr_hqx"},
                                   {b64a, AV_PIX_FMT_YUV444P10LE, "dnxhr_444"}};
 // The layout follows the type of tape and the lines, see VideoEnc.
 constexpr VideoForm dvForms[] = {{YUYV, AV_PIX_FMT_YUV422P}};
-constexpr VideoForm j2kForms[] = {{YUYV, AV_PIX_FMT_YUV422P},     {I420, AV_PIX_FMT_YUV420P},
-                                  {W016, AV_PIX_FMT_YUV420P12LE}, {Y216, AV_PIX_FMT_YUV422P10LE},
-                                  {BGR4, AV_PIX_FMT_RGB24},       {b64a, AV_PIX_FMT_RGB48LE}};
+constexpr VideoForm j2kForms[] = {{YUYV, AV_PIX_FMT_YUV422P},
+                                  {I420, AV_PIX_FMT_YUV420P},
+                                  {BGR4, AV_PIX_FMT_RGB24},
+                                  {b64a, AV_PIX_FMT_RGB48LE}};
 constexpr VideoForm proresForms[] = {{Y216, AV_PIX_FMT_YUV422P10LE}, {b64a, AV_PIX_FMT_YUVA444P10LE, "4444"}};
 constexpr VideoForm ffv1Forms[] = {{I420, AV_PIX_FMT_YUV420P},     {YUYV, AV_PIX_FMT_YUV422P},
                                    {W016, AV_PIX_FMT_YUV420P16LE}, {Y216, AV_PIX_FMT_YUV422P16LE},
-                                   {BGR4, AV_PIX_FMT_BGR0},        {BGRA, AV_PIX_FMT_BGRA}};
+                                   {BGR4, AV_PIX_FMT_BGR0},        {BGRA, AV_PIX_FMT_BGRA},
+                                   {b64a, AV_PIX_FMT_RGBA64LE}};
 
 constexpr unsigned predictive = rated | groups | reorders | pixelAspect;
 
@@ -57,7 +59,7 @@ constexpr auto rows = std::to_array<VideoCodec>({
         16, 4080, 2,    100e3, 100e6, 1.15e6, "", 0, 0,         "", "",                        "",     15,  3, 8,  "sc_threshold=1000000000", ""},
     {"mpeg4venc",   "",       "mpeg4",      plainForms,  "MP4V", "m4v",  predictive | interlaced | setsFirst | statsText,
         16, 4096, 2,    16e3, 100e6, 2e6,     "", 0, 0,         "", "",                        "",     150, 2, 4,  "sc_threshold=1000000000", ""},
-    {"vc3venc",     "",       "dnxhd",      dnxForms,    "AVDN", "dnxhd", interlaced,
+    {"vc3venc",     "",       "dnxhd",      dnxForms,    "AVDN", "dnxhd", interlaced | keepsForm,
         256, 8192, 2,   1e6, 2e9, 0,          "", 0, 0,         "", "",                        "",     1,   1, 1,  "", "dnxhr_hq"},
     {"dvvenc",      "",       "dvvideo",    dvForms,     "DVSD", "dv",   interlaced,
         480, 1440, 1,   25e6, 100e6, 0,        "", 0, 0,         "", "",                        "",     1,   1, 1,  "", "25"},
@@ -67,9 +69,9 @@ constexpr auto rows = std::to_array<VideoCodec>({
         16, 8192, 1,    1e6, 2e9, 0,          "", 0, 0,         "", "",                        "",     1,   1, 1,  "format=j2k", ""},
     {"h265venc",    "",       "libx265",    x265Forms,   "HEVC", "265",  predictive | setsFirst | borrows | statsFile,
         16, 16384, 2,   32e3, 800e6, 0,       "crf", 24, 51,      "preset", "medium",         "tune", 250, 5, 17, "", "", speeds, x265Tunes},
-    {"proresvenc",  "",       "prores_ks",  proresForms, "APCH", "mov",  interlaced,
+    {"proresvenc",  "",       "prores_ks",  proresForms, "APCH", "mov",  interlaced | keepsForm,
         16, 16384, 2,   1e6, 4e9, 0,          "", 0, 0,         "", "",                        "",     1,   1, 1,  "vendor=apl0", "hq"},
-    {"ffv1venc",    "",       "ffv1",       ffv1Forms,   "FFV1", "mkv",  interlaced,
+    {"ffv1venc",    "",       "ffv1",       ffv1Forms,   "FFV1", "mkv",  interlaced | keepsForm,
         16, 16384, 1,   1e6, 4e9, 0,          "", 0, 0,         "", "",                        "",     1,   1, 1,  "level=3:slicecrc=1:slices=4", ""},
     {"av1venc",     "",       "libaom-av1", aomForms,    "AV01", "obu",  rated | groups | borrows | statsText | pixelAspect,
         16, 16384, 2,   32e3, 800e6, 0,       "crf", 32, 63,      "cpu-used", "6",            "tune", 250, 1, 1,  "row-mt=1", ""},

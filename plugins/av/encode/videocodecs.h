@@ -25,7 +25,8 @@ enum : unsigned {
     statsText = 64,   // statistics of a first pass are a text that the library hands over
     statsFile = 128,  // ... or files that it writes
     pixelAspect = 256,
-    captions = 512  // keeps caption data with its pictures
+    captions = 512,   // keeps caption data with its pictures
+    keepsForm = 1024  // for masters and archives: takes the form that the input has
 };
 }
 

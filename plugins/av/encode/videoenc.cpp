@@ -139,10 +139,14 @@ std::string VideoEnc::prepare() {
     if (!library) return std::string("The installed library has no encoder ") + codec.encoder;
     if (s.width < 1 || s.height < 1) return "No size of the picture is set";
     if (!s.rateKnown) return "No frame rate is set";
-    if (s.width > codec.most || s.height > codec.most || s.width < std::min(codec.least, 16) ||
-        s.height < std::min(codec.least, 16) || s.width % codec.step != 0 || s.height % codec.step != 0)
-        return "The codec does not take pictures of " + std::to_string(s.width) + "x" +
-               std::to_string(s.height);
+    const int least = std::min(codec.least, 16);
+    if (std::max(s.width, s.height) > codec.most || std::min(s.width, s.height) < least ||
+        s.width % codec.step != 0 || s.height % codec.step != 0)
+        return "Sides of pictures are " + std::to_string(least) + " to " + std::to_string(codec.most) +
+               " pixels" + (codec.step > 1 ? ", multiples of " + std::to_string(codec.step) : "") + ", not " +
+               std::to_string(s.width) + "x" + std::to_string(s.height);
+    if (s.codesFields() && !s.takesFields())
+        return "The codec takes two fields a picture in 4:2:2 of 1920x1080 only";
     if (s.twoPass && !s.passes) return "There are no statistics of a first pass";
     context_.reset(avcodec_alloc_context3(library));
     packet_.reset(av_packet_alloc());
@@ -155,15 +159,26 @@ std::string VideoEnc::prepare() {
     if (problem.empty()) problem = configurePass();
     if (!problem.empty()) return problem;
     const int opened = avcodec_open2(context_.get(), library, nullptr);
-    if (opened < 0)
-        return std::string("The encoder does not take these settings (") + codec.encoder + ": " +
-               errorText(opened) + ")";
+    if (opened < 0) return refusal(opened);
     if (!input_.open(s.type, context_->pix_fmt, s.width, s.height, context_->colorspace,
                      codec.has(VideoTrait::borrows)))
         return "Frames of this form can not be converted";
     if (codec.has(VideoTrait::setsFirst) && context_->extradata_size > 0)
         sets_.assign(context_->extradata, context_->extradata + context_->extradata_size);
     return "";
+}
+
+// The library's own reason is in the log.
+std::string VideoEnc::refusal(int code) const {
+    if (code == AVERROR(ENOMEM)) return "Out of memory";
+    const VideoSettings& s = settings_;
+    const auto part = [](const char* name, const std::string& value) {
+        return value.empty() ? "" : std::string(", ") + name + " '" + value + "'";
+    };
+    return "The encoder does not take these settings: " + std::to_string(s.width) + "x" +
+           std::to_string(s.height) + " " + qvFourccText(s.type).data() + ", " +
+           s.rate.desc(false, false).asString("") + part("profile", s.codecProfile) +
+           part("preset", s.preset) + part("tune", s.tune) + part("options", s.options);
 }
 
 std::string VideoEnc::configure(AVPixelFormat layout) {
@@ -213,7 +228,9 @@ std::string VideoEnc::describeCodec() {
     if (!set(s.codec->tune, s.tune)) return "There is no tune '" + s.tune + "'";
     if (is(*s.codec, "dvvenc") || is(*s.codec, "dv100venc")) return "";
     const VideoForm& form = *s.codec->form(s.type);
-    const std::string profile = form.profile ? form.profile : s.codecProfile;
+    const std::string profile = s.codesFields() && is(*s.codec, "vc3venc") ? "dnxhd"
+                                : form.profile                             ? form.profile
+                                                                           : s.codecProfile;
     if (!set("profile", profile)) return "There is no profile '" + profile + "'";
     return "";
 }
@@ -229,6 +246,8 @@ std::string VideoEnc::configureRate() {
         if (s.n > 1 && s.codec->has(VideoTrait::statsText)) c.flags |= AV_CODEC_FLAG_CLOSED_GOP;
         if (s.m > 1 && is(*s.codec, "h264venc")) av_opt_set(&c, "forced-idr", "1", AV_OPT_SEARCH_CHILDREN);
     }
+    // Which of the tables of DNxHD it is: that of its highest quality.
+    if (s.codesFields() && is(*s.codec, "vc3venc")) c.bit_rate = s.rate.rate().ratio() > 26 ? 220e6 : 185e6;
     if (!s.codec->has(VideoTrait::rated)) return "";
     if (s.byQuality()) {
         av_opt_set(&c, s.codec->quality, std::to_string(s.quality).c_str(), AV_OPT_SEARCH_CHILDREN);

@@ -48,8 +48,7 @@ std::span<const Rate> ratesOf(const S& s) {
 void framerateRange(const S& s, Any& value) {
     AnyVector all;
     for (const Rate& row : ratesOf(s))
-        if (row.interlaced == 0 || s.codec->has(VideoTrait::interlaced))
-            all.append(QvFramerate(row.rate, row.interlaced));
+        if (row.interlaced == 0 || s.takesFields()) all.append(QvFramerate(row.rate, row.interlaced));
     value = all;
 }
 
@@ -154,14 +153,29 @@ int setStandard(S& s, const Any& value) {
 int setNamed(const S& s, const char* option, const char* words, const Any& value, std::string& to) {
     std::string wanted;
     const AVCodec* const library = s.codec->library();
-    if (!library || !qvparam::convert(value, wanted) || wanted.find_first_of(":='\\") != wanted.npos)
+    if (!library || !qvparam::convert(value, wanted) || wanted.find_first_of(":='\\ ") != wanted.npos)
         return QvStatus::invalidParam;
     if (*words && !wanted.empty() && !std::strstr(words, (" " + wanted + " ").c_str()))
         return QvStatus::invalidParam;
-    if (!wanted.empty() && !checkOptions(*library, std::string(option) + "=" + wanted).empty())
+    if (!*words && !wanted.empty() && !checkOptions(*library, std::string(option) + "=" + wanted).empty())
         return QvStatus::invalidParam;
     to = wanted;
     return QvStatus::ok;
+}
+
+// Names that the library finds out late. "": it is asked.
+const char* profilesOf(const VideoCodec& codec) {
+    const std::string_view module = codec.module;
+    if (module == "h264venc") return " baseline main high high10 high422 high444 ";
+    if (module == "h265venc")
+        return " main main-intra mainstillpicture main444-8 main444-intra main444-stillpicture main10"
+               " main10-intra main422-10 main422-10-intra main444-10 main444-10-intra ";
+    if (module == "dvvenc") return " 25 dvcpro25 50 100 ";
+    return module == "dv100venc" ? " 100 " : "";
+}
+
+int setCodecProfile(S& s, const Any& value) {
+    return setNamed(s, "profile", profilesOf(*s.codec), value, s.codecProfile);
 }
 
 int setPasses(S& s, const Any& value) {
@@ -236,9 +250,10 @@ const Row commonRows[] = {
     {"colourSpace", &S::space, qvParamStored, 0, 255, "", "", "code point of ITU-T H.273; 0: by the matrix"},
     {"threads", &S::threads, qvParamStored, 0, 64, "", "", "of the codec; 0: one a core"},
     {.name = "codecProfile",
-     .member = &S::codecProfile,
+     .member = Access{setCodecProfile, [](C s, Any& v) { v = textOf(s.codecProfile); }},
      .flags = qvParamStored,
-     .help = "the codec's own profile by the library's name"},
+     .help = "the codec's own profile by the library's name",
+     .type = Any::String},
     {.name = "avOptions",
      .member = Access{[](S& s, const Any& value) {
                           std::string wanted;
@@ -262,6 +277,7 @@ const Row commonRows[] = {
     {"accelerationType", {}, qvParamIgnored},
     {"selectedFOURCC", Access{nullptr, [](C s, Any& v) { v = static_cast<int>(s.type); }}},
     {"allowedTypes", Access{nullptr, allowedTypes}},
+    {"keepsForm", Access{nullptr, [](C s, Any& v) { v = s.codec->has(VideoTrait::keepsForm) ? 1 : 0; }}},
     {"sizeRange", Access{nullptr, sizeRange}},
     {"framerateRange", Access{nullptr, framerateRange}},
     {"aspectRange", Access{nullptr, [](C, Any& v) { v = AnyDict("min", 0.1, "max", 10.0); }}},
@@ -377,6 +393,12 @@ std::span<const QvParamRow<VideoSettings>> VideoSettings::rows(const VideoCodec&
     static const std::vector<Row> rated = tableOf(*videoCodec("mpegvenc"));
     static const std::vector<Row> plain = tableOf(*videoCodec("ffv1venc"));
     return *codec.quality ? quality : codec.has(VideoTrait::rated) ? rated : plain;
+}
+
+// DNxHR has none, and the DNxHD of fields is that of broadcasting.
+bool VideoSettings::takesFields() const {
+    if (std::strcmp(codec->module, "vc3venc") != 0) return codec->has(VideoTrait::interlaced);
+    return (width == 0 || (width == 1920 && height == 1080)) && type != QvFourcc::b64a;
 }
 
 void VideoSettings::applyProfile() {

@@ -37,6 +37,9 @@ struct VideoSettings {
     bufstream* passes = nullptr;  // borrowed
 
     bool byQuality() const { return quality >= 0; }
+    bool codesFields() const { return rate.interlaced() != 0; }
+    // The codec has such pictures of two fields; of a size that is not set yet, it may.
+    bool takesFields() const;
     // The tables that the codec has, in the order in which they are stored and restored.
     static std::span<const QvParamRow<VideoSettings>> rows(const VideoCodec& codec);
     // What a preset stands for; what it leaves open stays.

@@ -63,7 +63,7 @@ constexpr auto containers = std::to_array<Container>({
     {"webm",         codecBits(vp8, vp9, av1, opus, vorbis),                       16, 32, PipeForm::live,
          title | commonTags | allTags | chapters | language,
          lengths},
-    {"mxf",          codecBits(mpeg2, h264, dnxhd, dv, jpeg2000, prores, pcm),      1, 16, PipeForm::same,
+    {"mxf",          codecBits(mpeg2, h264, dnxhd, dv, jpeg2000, prores, pcm),      1, 16, PipeForm::none,
          title | timecode,
          pixels | needsVideo | soundHeader, codecBit(h264)},
     {"mpegts",       codecBits(h264, hevc, mpeg1, mpeg2, mpeg4, aac, mp2, mp3, ac3, eac3, opus), 8, 32, PipeForm::same,

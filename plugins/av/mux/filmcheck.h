@@ -10,7 +10,7 @@ namespace av {
 
 struct FilmExpectation {
     bool video;
-    long long units;  // written
+    long long units;  // written; -1: its index does not count them
 };
 
 // `format` is that of a Container. What is wrong with the file: it can't be opened, streams are missing, or

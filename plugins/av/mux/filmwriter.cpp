@@ -215,7 +215,8 @@ void FilmWriter::setOptions(AVDictionary** options) {
         if (pipe) {
             av_dict_set(options, "min_frag_duration", "1000000", 0);
             av_dict_set(options, "frag_duration", "10000000", 0);
-        } else if (job_.fastStart && job_.frames > 0 && indexBytes() < INT_MAX) {
+        } else if (job_.fastStart && job_.frames > 0 && indexBytes() < INT_MAX &&
+                   !makesFragments(job_.options)) {
             av_dict_set_int(options, "moov_size", indexBytes(), 0);
             spaceKept_ = true;
         }

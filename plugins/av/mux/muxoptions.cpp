@@ -50,7 +50,19 @@ std::string unknown(const std::string& name, const std::vector<std::string>& all
     return text;
 }
 
+// Writes the film a second time in another order, which takes files of the library's own.
+bool reorders(const std::string& name, const std::string& value) {
+    return name == "moov_size" || name == "cues_to_front" ||
+           (name == "movflags" && value.find("faststart") != value.npos);
+}
+
 }  // namespace
+
+bool makesFragments(const std::string& options) {
+    for (const char* word : {"frag", "empty_moov", "dash", "cmaf", "isml"})
+        if (options.find(word) != options.npos) return true;
+    return false;
+}
 
 std::string parseMuxOptions(const std::string& text, const char* format, AVDictionary** options) {
     const AVOutputFormat* const kind = av_guess_format(format, nullptr, nullptr);
@@ -64,6 +76,11 @@ std::string parseMuxOptions(const std::string& text, const char* format, AVDicti
     while (problem.empty() && (entry = av_dict_get(read, "", entry, AV_DICT_IGNORE_SUFFIX))) {
         if (std::find(all.begin(), all.end(), entry->key) == all.end()) {
             problem = unknown(entry->key, all, format);
+            continue;
+        }
+        if (reorders(entry->key, entry->value)) {
+            problem = std::string("the place of the index is the parameter 'fastStart', not '") + entry->key +
+                      "=" + entry->value + "'";
             continue;
         }
         AVFormatContext* trial = nullptr;

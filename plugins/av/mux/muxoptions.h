@@ -11,4 +11,7 @@ namespace av {
 // "" if nothing is. `options`, which may be null, gets the entries.
 std::string parseMuxOptions(const std::string& text, const char* format, AVDictionary** options);
 
+// They ask for MP4 in fragments, which has no index of the whole film.
+bool makesFragments(const std::string& options);
+
 }  // namespace av

@@ -239,7 +239,8 @@ bool MuxTrack::describeRaw(const QvCodec& encoder) {
     to.width = intParam(encoder, "width", 0);
     to.height = intParam(encoder, "height", 0);
     QvFrame frame;
-    if (to.width < 1 || to.height < 1 || frame.init(type, to.width, to.height) != 0)
+    if (to.width < 1 || to.height < 1 || std::max(to.width, to.height) > limits::side ||
+        frame.init(type, to.width, to.height) != 0)
         return fail("there are no pictures of " + std::to_string(to.width) + "x" + std::to_string(to.height));
     pictureBytes_ = frame.total_bytes();
     codec_ = &muxCodecRow(MuxCodec::raw);

@@ -35,6 +35,7 @@ using FramePtr = std::unique_ptr<AVFrame, Free>;
 using CodecPtr = std::unique_ptr<AVCodecContext, Free>;
 
 inline std::string errorText(int code) {
+    if (code == -1) return "no reason is given";  // not the one of the system with that number
     char text[AV_ERROR_MAX_STRING_SIZE] = {};
     av_strerror(code, text, sizeof text);
     return text;

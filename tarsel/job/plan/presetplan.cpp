@@ -4,6 +4,7 @@
 #include <utility>
 
 #include "tarsel/job/plan/colours.h"
+#include "tarsel/presets/encoderforms.h"
 #include "tarsel/presets/ranges.h"
 #include "tarsel/source/source.h"
 #include "tarsel/words/messages.h"
@@ -155,6 +156,8 @@ void PresetPlanner::settle() {
         else
             checkSoundRanges(preset, encoder, stream.sound.samplerate, stream.sound.channels,
                              stream.sound.bits);
+        if (stream.isVideo() && !options_.encoders.sets("type"))
+            takeForm(encoder, stream.picture.fourcc, !effects_.pixel.empty());
         setFormat(encoder, stream);
         if (stream.isVideo()) setColours(stream, encoder);
         encoder.store(stream.codec);

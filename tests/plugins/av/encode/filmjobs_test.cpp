@@ -2,6 +2,7 @@
 #include <gmock/gmock.h>
 
 #include <filesystem>
+#include <sstream>
 
 #include "tests/plugins/av/films.h"
 
@@ -41,6 +42,12 @@ TEST_F(FilmJobs, areWhatTheirOptionsSay) {
          "size=96x64",
          {"--vcodec", "h265venc:avOptions=x265-params=aq-mode=1", "--bitrate", "300k", "--two-pass"},
          "codec_name=hevc"},
+        {"e.mxf", "size=1920x1080", {"--vcodec", "vc3venc", "--rate", "25i"}, "field_order=tt"},
+        {"f.mp4",
+         "size=96x64",
+         {"--vcodec", "h264venc:codecProfile=baseline", "--muxer",
+          "mp4mux:avOptions=movflags=+frag_keyframe"},
+         "profile=Constrained Baseline"},
     };
     for (const auto& row : rows) {
         SCOPED_TRACE(row.name);
@@ -53,6 +60,39 @@ TEST_F(FilmJobs, areWhatTheirOptionsSay) {
         EXPECT_EQ(read.status, 0) << read.err;
         EXPECT_EQ(read.err, "");
     }
+}
+
+// An archive has the pictures that its source has; the others take another form when they are asked.
+TEST_F(FilmJobs, keepTheFormOfTheirPictures) {
+    const struct {
+        const char *layout, *options, *name;
+        const char* kept;  // as the result is read
+    } rows[] = {
+        {"yuv420p", "ffv1venc", "a.mkv", "yuv420p"},     {"yuv422p", "ffv1venc", "b.mkv", "yuv422p"},
+        {"yuv420p10", "ffv1venc", "c.mkv", "yuv420p16"}, {"yuv422p10", "ffv1venc", "d.mkv", "yuv422p16"},
+        {"bgra", "ffv1venc", "e.mkv", "bgra"},           {"rgba64", "ffv1venc", "f.mkv", "gbrap16"},
+        {"yuv422p10", "vc3venc", "g.mov", "yuv422p10"},  {"yuv420p10", "h264venc", "h.mp4", "yuv420p"},
+    };
+    for (const auto& row : rows) {
+        SCOPED_TRACE(row.name);
+        const std::string from =
+            film("from.mkv", {"-c:v", "ffv1", "-pix_fmt", row.layout}, "testsrc2=size=320x240:duration=0.2");
+        const Outcome made = tarsel({"transcode", "from.mkv", "-y", "--vcodec", row.options, "-o", row.name});
+        EXPECT_EQ(made.status, 0) << made.err;
+        EXPECT_THAT(facts(row.name), HasSubstr(std::string("pix_fmt=") + row.kept));
+        if (std::string(row.options) == "ffv1venc") {
+            EXPECT_TRUE(pictures(folder.file(row.name), row.layout) == pictures(from, row.layout));
+        }
+    }
+    for (const char* options : {"h264venc W016 yuv420p10 x.mp4", "mpegvenc YUYV yuv422p x.ts"}) {
+        std::istringstream words(options);
+        std::string codec, pixel, layout, name;
+        words >> codec >> pixel >> layout >> name;
+        EXPECT_EQ(job("size=96x64", {"--vcodec", codec, "--pixel", pixel, "-o", name}).status, 0) << options;
+        EXPECT_THAT(facts(name), HasSubstr("pix_fmt=" + layout));
+    }
+    EXPECT_THAT(job("size=96x64", {"--vcodec", "mpegvenc", "--pixel", "b64a", "-o", "x.ts"}).err,
+                HasSubstr("--pixel b64a: the encoder 'mpegvenc' takes I420, YUYV"));
 }
 
 // The engine puts a header before raw sound for MXF.
@@ -77,7 +117,12 @@ TEST_F(FilmJobs, areRefusedWithTheEncodersOwnReason) {
         Words options;
         const char* why;
     } rows[] = {
-        {{"--vcodec", "h264venc:avOptions=max_pixels=1", "-o", "x.mkv"}, "does not take these settings"},
+        {{"--vcodec", "h264venc:avOptions=max_pixels=1", "-o", "x.mkv"}, "these settings: 96x64 I420, 25p"},
+        {{"--vcodec", "h264venc:codecProfile=highest", "-o", "x.mkv"}, "can't take this value"},
+        {{"--vcodec", "h264venc", "--size", "95x63", "-o", "x.mkv"}, "multiples of 2, not 95x63"},
+        {{"--vcodec", "vc3venc", "--size", "720x576", "--rate", "25i", "-o", "x.mkv"}, "--rate 25i"},
+        {{"--muxer", "mp4mux:avOptions=movflags=+faststart", "-o", "x.mp4"}, "parameter 'fastStart'"},
+        {{"--vcodec", "vc3venc", "--size", "256x120", "--muxer", "mxfmux:seekable=0", "-o", "x.mxf"}, "pipe"},
         {{"--vcodec", "mpeg4venc:avOptions=threads=100000", "-o", "x.mkv"}, "own parameters decide"},
     };
     for (const auto& row : rows) {
