@@ -90,7 +90,7 @@ std::string attribute(const XmlNode& node, const char* name) {
 struct Numbers {
     Text element;
     Range range;
-    const char *attributes[4], *others[3];
+    const char *attributes[4], *others[4];
 };
 
 // Elements whose attributes are numbers: those that must be there, and others.
@@ -100,7 +100,7 @@ constexpr Numbers numbersOf[] = {
     {"rect", Range::i32, {"top", "bottom", "left", "right"}, {}},
     {"pair", Range::i32, {"first", "second"}, {}},
     {"mediatime", Range::i64, {"ticks", "scale"}, {}},
-    {"bitrate", Range::i32, {"target"}, {"min", "max", "mode"}},
+    {"bitrate", Range::i32, {}, {"target", "min", "max", "mode"}},  // what is 0 is not written
 };
 
 bool isDictionary(const Place& place) {
