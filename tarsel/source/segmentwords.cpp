@@ -1,5 +1,7 @@
 #include "tarsel/source/segmentwords.h"
 
+#include <utility>
+
 #include "tarsel/host/files.h"
 #include "tarsel/source/source.h"
 #include "tarsel/words/messages.h"
@@ -35,7 +37,9 @@ TimeRange parseRange(const std::string& text, const std::string& option) {
 }
 
 SegmentWords parseSegment(const std::string& word) {
-    const size_t at = exists(word) ? std::string::npos : word.rfind('@');
-    if (at == std::string::npos || !looksLikeRange(word.substr(at + 1))) return {namesIn(word), {}, word};
+    const size_t at = word.rfind('@');
+    std::vector<std::string> whole = namesIn(word);
+    if (at == std::string::npos || !looksLikeRange(word.substr(at + 1)) || exists(whole.back()))
+        return {std::move(whole), {}, word};
     return {namesIn(word.substr(0, at)), parseRange(word.substr(at + 1), word), word};
 }

@@ -262,6 +262,9 @@ TEST_F(Join, NamesAreReadAsTheyExist) {
     for (const char* name : {"a@1-2", "a+b.wav", "c.wav@3-4"}) folder.write(name, wav);
     works({"transcode", "--join", "a+b.wav", "s.wav@0-1", "-o", "o.wav"});
     EXPECT_EQ(size("o.wav"), 80 + 4 * (kSamples + 44100));
+    folder.write("q@1-2", contents("p.yuv"));
+    works(Words{"transcode", "--join", "s.wav+q@1-2", "-o", "n.yuv"} + kRaw);
+    EXPECT_EQ(levels("n.yuv").size(), static_cast<std::size_t>(kFrames)) << "the whole file";
     works({"transcode", "--join", "s.wav@1-", "s.wav@-1", "s.wav@1--0.5", "-o", "p.wav"});
     EXPECT_EQ(size("p.wav"), 80 + 4 * (kSamples + kSamples - 44100 - 22050));
 }

@@ -260,6 +260,8 @@ int JoinedSegments::nextSound(int stream) {
 }
 
 int JoinedSegments::readFrame(int stream) {
+    // A task that has passed its pictures on in one run may encode them in the next.
+    if (isSmart(stream)) smartStreams.remove(smartStreams.indexOf(Any(stream)));
     while (current < sizeOf(segments)) {
         QvFrame* frame = nullptr;
         int result = at(at(segments, current).videos, stream)->read(frame, why);

@@ -15,6 +15,7 @@ namespace {
 // A stream's selection and where the next read starts.
 struct Place {
     bool selected = false;
+    bool userData = false;  // is read
     long long next = 0;
     bool sought = false;  // `next` may not be where the source stands when it is opened
     int fault = 0;        // of the last attempt to go there
@@ -67,6 +68,8 @@ struct LazyDecoder::Source {
                 place.sought |= used;
                 if (place.selected != decoder->isSelected(type, number))
                     place.selected ? decoder->select(type, number) : decoder->deselect(type, number);
+                if (type == qvVideoStream && place.userData != decoder->readUserData(type, number))
+                    decoder->setReadUserData(type, number, place.userData);
                 if (place.selected) go(type, number);
             }
         spoiled = false;
@@ -103,7 +106,7 @@ LazyDecoder::LazyDecoder(std::shared_ptr<OpenDecoders> others, std::shared_ptr<c
     source_->own = others_->order_.end();
     for (const int type : {qvVideoStream, qvAudioStream, qvSubpicStream})
         for (const SourceFacts::Stream& stream : source_->facts->of(type))
-            source_->of(type).push_back({.selected = stream.selected});
+            source_->of(type).push_back({.selected = stream.selected, .userData = stream.readsUserData});
     setState(stateInitialised);
 }
 
@@ -399,10 +402,18 @@ int LazyDecoder::readEncodedFrame(int stream, unsigned char* to) {
     return copyError(forGood().readEncodedFrame(stream, to));
 }
 
+// Links ask every segment for it, so it must not open their sources.
 int LazyDecoder::setReadUserData(int type, int stream, bool on) {
-    return copyError(forGood().setReadUserData(type, stream, on));
+    Place* place = source_->place(type, stream);
+    if (!place || source_->decoder) {
+        const int result = mustBeAwake().setReadUserData(type, stream, on);
+        if (result != QvStatus::ok || !place) return result;
+    }
+    place->userData = on;
+    return QvStatus::ok;
 }
 
 bool LazyDecoder::readUserData(int type, int stream) const {
-    return mustBeAwake().readUserData(type, stream);
+    const Place* place = source_->place(type, stream);
+    return place && !source_->decoder ? place->userData : mustBeAwake().readUserData(type, stream);
 }

@@ -255,12 +255,13 @@ long long addChapters(const QvIStream& stream, const QvFramerate& out, long long
     return span.owed;
 }
 
-// What the segments have for the stream as a whole: their chapters at the places that they get there, and the
-// quality log of the first that has one.
+// What the segments have for the stream as a whole: their chapters at the places that they get there, and all
+// logs of quality, each once.
 ProcessParams joinedParams(const std::vector<std::unique_ptr<QvInputSegment>>& segments, std::size_t place,
                            const Any& rate) {
     std::vector<const QvIStream*> streams;
     bool chapters = false;
+    AnyVector logs;
     ProcessParams params;
     for (const auto& segment : segments) {
         if (segment->status != QvInputSegment::opened || place >= segment->streams.size()) continue;
@@ -268,9 +269,10 @@ ProcessParams joinedParams(const std::vector<std::unique_ptr<QvInputSegment>>& s
         if (!stream.decoder) continue;
         streams.push_back(&stream);
         chapters |= stream.params.chapterPoints() != nullptr;
-        if (const auto log = stream.params.getQualityStatsSetup(); log && !params.getQualityStatsSetup())
-            params.setQualityLog(*log);
+        for (const Any& log : stream.params.getVector("qualityStats"))
+            if (!logs.contains(log)) logs.append(log);
     }
+    if (!logs.empty()) params.setQualityLog(logs);
     if (!chapters || !rate.isFramerate()) return params;
     AnyVector all;
     long long before = 0;

@@ -100,7 +100,7 @@ constexpr Numbers numbersOf[] = {
     {"rect", Range::i32, {"top", "bottom", "left", "right"}, {}},
     {"pair", Range::i32, {"first", "second"}, {}},
     {"mediatime", Range::i64, {"ticks", "scale"}, {}},
-    {"bitrate", Range::i32, {}, {"target", "min", "max", "mode"}},  // those that are 0 are not written
+    {"bitrate", Range::i32, {}, {"target", "min", "max", "mode"}},  // what is 0 is not written
 };
 
 bool isDictionary(const Place& place) {

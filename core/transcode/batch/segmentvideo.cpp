@@ -59,10 +59,12 @@ int SegmentVideo::prepare(const VideoJobDescription& output, const SegmentVideo*
     job_.stopFrame = static_cast<int>(span_.first + span_.count - 1);
     if (like && sameConversion(job_, like->job_)) {
         converts_ = like->converts_;
+        takesUserData_ = like->takesUserData_;
         return QvStatus::ok;
     }
     const int result = build(why);
     converts_ = pipe_ != nullptr;
+    takesUserData_ = filtersTakeUserData();
     pipe_.reset();
     return result;
 }
@@ -79,6 +81,12 @@ int SegmentVideo::build(std::string& why) {
     return QvStatus::ok;
 }
 
+bool SegmentVideo::filtersTakeUserData() const {
+    for (int i = 0; pipe_ && i < pipe_->nrFilters(); ++i)
+        if (pipe_->filter(i)->getParam("takesUserData").isTrue()) return true;
+    return false;
+}
+
 int SegmentVideo::start(std::string& why) {
     pipe_.reset();
     ended_ = delivered_ = false;
@@ -90,6 +98,8 @@ int SegmentVideo::start(std::string& why) {
         if (const int result = decoder.select(qvVideoStream, input_.number))
             return failedWith(result, decoder, why);
     }
+    if (takesUserData_ && !decoder.readUserData(qvVideoStream, input_.number))
+        decoder.setReadUserData(qvVideoStream, input_.number, true);
     const bool nothing = span_.owed < 1;
     const int result = nothing ? QvStatus::endOfStream : decoder.seek(span_.in, qvVideoStream, input_.number);
     ended_ = result == QvStatus::endOfStream;

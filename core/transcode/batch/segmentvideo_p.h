@@ -40,6 +40,7 @@ class SegmentVideo {
 
   private:
     int build(std::string& why);
+    bool filtersTakeUserData() const;
     int readDirect(QvFrame*& frame, std::string& why);
     int readConverted(QvFrame*& frame, std::string& why);
     int readInput(std::string& why);
@@ -49,6 +50,7 @@ class SegmentVideo {
     SegmentSpan span_;
     std::unique_ptr<QvVProcessPipe> pipe_;
     bool converts_ = false;
+    bool takesUserData_ = false;  // a filter looks at it
     bool started_ = false;
     bool ended_ = false;
     bool delivered_ = false;  // the pipe's frame has been given out

@@ -17,6 +17,7 @@ SourceFacts::SourceFacts(QvDecodePipe& decoder)
             Stream& made = streams_[placeOf(type)].emplace_back();
             decoder.getStreamParams(type, i, made.params);
             made.selected = decoder.isSelected(type, i);
+            made.readsUserData = decoder.readUserData(type, i);
             if (type == qvSubpicStream) continue;
             made.units = type == qvVideoStream ? decoder.nrFrames(i) : decoder.nrSamples(i);
             made.duration = decoder.duration(type, i);

@@ -18,6 +18,7 @@ struct SourceFacts {
         long long units = 0;  // frames of video, samples of audio, 0 for subpictures
         MediaTime duration;   // 0 for subpictures
         bool selected = false;
+        bool readsUserData = false;
     };
 
     explicit SourceFacts(QvDecodePipe& decoder);  // which is open

@@ -58,6 +58,8 @@ class QV_API TransLink {
     virtual long long outProcessed() const = 0;  // frames or samples written
     // Takes the points, chapters, filters, channel map and quality log that `params` has; others stay.
     virtual void setProcessParams(const ProcessParams& params);
+    // Of this link alone, which setProcessParams leaves as it is; 0 is as the task says.
+    void setSmartRender(int mode) { processParams_.setSmartRender(mode); }
     // The index-th filter of that name in the pipe, or null.
     virtual QvCodec* filter(const char* name, int index) const = 0;
     // Captions of another stream for this link's frames; video only. `type` is the stream's type.

@@ -100,6 +100,7 @@ int FirstPass::make(const TPtrList<TransLink>& wanted) {
         links_.push_back({std::make_unique<TransVLink>(), &link});
         TransVLink& made = *links_.back().twin;
         if (made.init(link.decoder(), link.decStreamNr(), &pipe, i) != QvStatus::ok) return QvStatus::failed;
+        made.setCancel(run_.control.cancel());
         pipe.videoStream(i)->setEnabled(true);
         if (made.open(&params.at(i).asDict()) != QvStatus::ok) return QvStatus::failed;
     }

@@ -241,10 +241,10 @@ std::unique_ptr<QvTask> fromTemplate(const AnyDict& state, QvDecodePipe* decoder
             const AnyDict params = storedProcessParams(streams, type, k);
             ProcessParams own;
             if (params.get("filters").isDict()) own.set("filters", params.get("filters"));
-            if (TransLink* link = task->getLinkForOutput(type, k)) link->setProcessParams(own);
-            ProcessParams common;
-            common.set("smartRender", params.get("smartRender"));
-            task->setProcessParams(common, type);
+            TransLink* const link = task->getLinkForOutput(type, k);
+            if (!link) continue;  // a subpicture
+            link->setProcessParams(own);
+            link->setSmartRender(params.getInt32("smartRender", 0));
         }
         removeSurplusStreams(*pipe, type, std::min(given, wanted));
     }

@@ -85,9 +85,12 @@ void JoinPlanner::planTags() {
     whole_.tags = filmTags(parts, options_.tags);
 }
 
+size_t JoinPlanner::segmentCount() const {
+    return options_.join ? options_.inputs.size() : options_.cuts.size();
+}
+
 bool JoinPlanner::levelIsCommon() const {
-    const size_t segments = options_.join ? options_.inputs.size() : options_.cuts.size();
-    return !options_.sound.normalize.empty() && segments > 1;
+    return !options_.sound.normalize.empty() && segmentCount() > 1;
 }
 
 std::unique_ptr<JoinLevel> JoinPlanner::level() const {
@@ -101,14 +104,15 @@ std::string JoinPlanner::name() const {
 }
 
 int JoinPlanner::inputNumber(const std::string& name) {
-    const auto known = std::find(names_.begin(), names_.end(), name);
-    if (known != names_.end()) return static_cast<int>(known - names_.begin());
+    if (const auto known = numbers_.find(name); known != numbers_.end()) return known->second;
     const std::unique_ptr<Source> source = open_(name);
+    const int number = static_cast<int>(names_.size());
     names_.push_back(name);
+    numbers_.emplace(name, number);
     inputs_.push_back(readInput(*source));
-    join_.inputs.push_back(storedInput(*source, name, words().size() == 1));
+    join_.inputs.push_back(storedInput(*source, name, segmentCount() == 1));
     files_.insert(files_.end(), source->files().begin(), source->files().end());
-    return static_cast<int>(names_.size()) - 1;
+    return number;
 }
 
 PlanOptions JoinPlanner::optionsOf(const SegmentWords& words, const std::vector<JobInput>& inputs, bool first,

@@ -4,6 +4,7 @@
 #include <functional>
 #include <memory>
 #include <string>
+#include <unordered_map>
 #include <vector>
 
 #include "tarsel/job/plan/jobplan.h"
@@ -32,6 +33,7 @@ class JoinPlanner {
     std::string name() const;
 
   private:
+    size_t segmentCount() const;
     bool levelIsCommon() const;
     std::vector<SegmentWords> words() const;
     int inputNumber(const std::string& name);
@@ -45,6 +47,7 @@ class JoinPlanner {
     OutputForm form_;
     Opener open_;
     std::vector<std::string> names_;  // of Join::inputs
+    std::unordered_map<std::string, int> numbers_;
     std::vector<JobInput> inputs_;
     KnownFormats known_;
     Join join_;

@@ -192,6 +192,22 @@ TEST_F(JoinedPasses, CodedPicturesArePassedOnFromSeamToSeam) {
     EXPECT_EQ(account.decoded + account.encoded, 0);
     EXPECT_EQ(copied.samples.size(), 18u * 1920);
     EXPECT_TRUE(copied.samples == decoded.samples);
+
+    // A run that copies leaves nothing behind for one of the same task that encodes.
+    const auto open = restore();
+    ASSERT_TRUE(open->task) << open->error;
+    for (const bool copies : {true, false}) {
+        account = Account();
+        account.copies = true;
+        open->task->clearProcessParams(qvVideoStream);
+        QvTranscoder transcoder(open->task.get());
+        transcoder.setParam("startDelay", 0);
+        transcoder.setParam("smartRender", copies);
+        ASSERT_EQ(transcoder.transcode(true), 0) << transcoder.errorDesc();
+        EXPECT_EQ(account.copied, copies ? 18 : 0);
+        EXPECT_EQ(levels(written(".raw")), decoded.levels);
+        EXPECT_TRUE(samples(wavData()) == decoded.samples);
+    }
 }
 
 // A rate that is converted, and an encoder that refuses.

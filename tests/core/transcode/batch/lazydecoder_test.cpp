@@ -18,8 +18,11 @@ struct Sources {
             ++all_.opened;
         }
         ~Counted() override { --all_.open; }
+        int setReadUserData(int, int, bool on) override { return reads_ = on, 0; }
+        bool readUserData(int, int) const override { return reads_; }
 
       private:
+        bool reads_ = false;
         Sources& all_;
     };
 
@@ -157,6 +160,23 @@ TEST(LazyDecoder, ASourceThatFailedIsNotTakenOver) {
     first->deselect(2, 0);
     EXPECT_EQ(second->readFrame(0), 0);
     EXPECT_EQ(sources.opened, 2);
+}
+
+TEST(LazyDecoder, UserDataAreAskedForWithoutOpeningTheSource) {
+    Sources sources;
+    const auto open = std::make_shared<OpenDecoders>(4);
+    const auto wanting = sources.lazy(open), other = sources.lazy(open);
+    sources.opened = 0;
+    EXPECT_EQ(wanting->setReadUserData(1, 0, true), 0);
+    EXPECT_TRUE(wanting->readUserData(1, 0));
+    EXPECT_EQ(sources.opened, 0);
+    for (int round = 0; round < 2; ++round)  // opened, then taken over from the other one
+        for (LazyDecoder* decoder : {wanting.get(), other.get()}) {
+            EXPECT_EQ(decoder->readFrame(0), 0);
+            EXPECT_EQ(decoder->readUserData(1, 0), decoder == wanting.get());
+            decoder->giveUp();
+        }
+    EXPECT_EQ(sources.opened, 1);
 }
 
 // What has changed the source can't be done again, so it stays open with the others.

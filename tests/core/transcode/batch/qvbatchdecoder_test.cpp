@@ -48,10 +48,12 @@ class Source : public FakeDecoder {
         return 0;
     }
     bool isSelected(int type, int stream) const override { return chosen.count({type, stream}) > 0; }
+    int setReadUserData(int, int, bool on) override { return readsData = on, 0; }
+    bool readUserData(int, int) const override { return readsData; }
 
     std::set<std::pair<int, int>> chosen;
     std::function<void(QvFrame&)> onFrame;
-    bool failSound = false;
+    bool failSound = false, readsData = false;
 
   private:
     int id_;
@@ -331,6 +333,23 @@ TEST_F(BatchDecoder, FramesPassWithWhatTheyCarry) {
     }
     EXPECT_EQ(joined.readFrame(0), QvStatus::endOfStream);
     EXPECT_EQ(shownBy(*joined.getFramePtr(0)), (Shown{1, 5})) << "the last frame may be needed again";
+}
+
+// A filter of a segment asks the source of that segment alone.
+TEST_F(BatchDecoder, UserDataAreReadForTheFiltersOfASegment) {
+    joined.addOutputVideoStream(picture(f25));
+    const AnyDict filter("name", "userdata", "_on", 1, "_position", 1);
+    for (const bool filtered : {false, true, true}) {
+        std::vector<QvIStream> streams{{&source(2, f25), 1, 0}};
+        if (filtered) streams[0].params.setFilters(AnyDict("customFilters", AnyVector(Any(filter))));
+        ASSERT_EQ(insert(streams), 0);
+    }
+    ASSERT_EQ(joined.open(), 0) << joined.errorDesc();
+    for (int i = 0; i < 6; ++i) {
+        ASSERT_EQ(joined.readFrame(0), 0);
+        for (int k = 0; k < 3; ++k)
+            EXPECT_EQ(sources[static_cast<std::size_t>(k)]->readsData, k > 0 && k <= i / 2) << i;
+    }
 }
 
 TEST_F(BatchDecoder, PicturesOfOtherSizesAreScaled) {

@@ -125,12 +125,13 @@ TEST_F(Joined, ChaptersAndQualityLogsAreThoseOfTheWhole) {
         AnyVector(slow));
     add(AnyVector(with(fast, cut(0.2, 0.6), AnyVector(), 1)), AnyVector(fast));
     add(AnyVector(with(fast, cut(1, 2), AnyVector(Any(50), Any(54)), 2)), AnyVector(fast));
+    add(AnyVector(with(fast, cut(0, 1), AnyVector(), 1)), AnyVector(fast));
     const auto open = restore();
     ASSERT_TRUE(open->task) << open->error;
     const ProcessParams& params = open->task->getLinkForOutput(1, 0)->processParams();
     ASSERT_TRUE(params.chapterPoints());
     EXPECT_EQ(*params.chapterPoints(), AnyVector(Any(0), Any(9), Any(20), Any(22)));
-    EXPECT_EQ(params.get("qualityStats"), Any(AnyVector(Any(AnyDict("number", 1)))));
+    EXPECT_EQ(params.get("qualityStats"), Any(AnyVector(AnyDict("number", 1), AnyDict("number", 2))));
 }
 
 // A frame of 1001/30000 s has 1471.47 samples of 44100 a second: no seam rounds for the next one.

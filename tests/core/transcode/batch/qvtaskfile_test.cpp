@@ -1,5 +1,6 @@
 #include "core/transcode/batch/qvtaskfile.h"
 
+#include <cmath>
 #include <sstream>
 
 #include "core/encode/qvencodepipe.h"
@@ -26,6 +27,23 @@ TEST(QvTaskFile, ASoundOneOpens) {
     const std::unique_ptr<QvEncodePipe> owned(pipe);
     EXPECT_EQ(task->nrLinks(), 2);
     decoders.deleteAll();
+}
+
+// An encoder that keeps a quality has a bit rate of 0, for one.
+TEST(QvTaskFile, AllThatIsStoredIsSound) {
+    const TaskFile file;
+    AnyDict state;
+    Any root, version;
+    ASSERT_EQ(XmlParser::restoreDict(file.name.c_str(), state, root, version), 0);
+    AnyVector values;
+    for (const Any& value : {Any(), Any(QvBitrate()), Any(QvBitrate(1, 0, 0, 5)), Any(QvBitrate(9, 1)),
+                             Any(Pair()), Any(MediaTime()), Any(QvFramerate()), Any(-1LL), Any(1e300),
+                             Any(std::nan("")), Any(""), Any(AnyDict()), Any(AnyVector())})
+        values.append(value);
+    state.set("values", values);
+    ASSERT_EQ(XmlParser::storeDict(file.name.c_str(), state, "TranscodeTask", "2.0"), 0);
+    const QvTaskFault fault = QvTaskFile::check(file.name.c_str());
+    EXPECT_EQ(fault.status, 0) << fault.path << ": " << fault.reason;
 }
 
 TEST(QvTaskFile, AFaultHasItsPlaceAndReason) {
@@ -73,6 +91,8 @@ TEST(QvTaskFile, AFaultHasItsPlaceAndReason) {
          "it is no whole number of 32 bits", "<i32>"},
         {"<key>rate", "\"25\"", "\"4294967321\"", "rate", "its 'num' is no whole number of 32 bits",
          "<framerate"},
+        {"<Tr", "<key>gain", "<key>b</key><bitrate type=\"vbr\" target=\"x\"/><key>gain", "b",
+         "its 'target' is no whole number of 32 bits", ""},
         {"<key>rate", "interlaced=\"0\"", "interlaced=\"yes\"", "rate",
          "its 'interlaced' is no whole number of 32 bits", "<framerate"},
     };

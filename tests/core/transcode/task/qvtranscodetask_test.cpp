@@ -199,7 +199,11 @@ TEST(TaskTemplate, TakesWhatTheSourceHas) {
     EXPECT_EQ(task->nrLinks(), 1);
     EXPECT_TRUE(task->getLink(0)->processParams().isSet("filters"));
     EXPECT_FALSE(task->getLink(0)->processParams().isSet("inOutPoints"));
-    EXPECT_EQ(task->processParams(2).getInt32("smartRender"), 1);
+    EXPECT_EQ(task->getLink(0)->processParams().smartRender(), 1);
+    EXPECT_EQ(task->processParams(2).smartRender(), 0) << "not of all sounds";
+    AnyVector open;
+    QvTask::makeOpenParams(*task, task->links(), open);
+    EXPECT_EQ(open.at(0).asDict().get("smartRender"), Any(1));
     EXPECT_STREQ(task->postprocessCommand().asString(), "true %i");
     task.reset();
 
