@@ -173,8 +173,7 @@ void frame(Given& given) {
     if (!given.stream && !(extension == "png")) throw failure(Msg::pictureName, {"-o", given.output});
     if (!given.stream && NumberedName::parse(fs::path(given.output).filename().string()))
         throw failure(Msg::pictureNumbered, {given.output});
-    Source source(given.input, given.raw, nullptr,
-                  given.noRotate ? Source::Turned::asCoded : Source::Turned::upright);
+    Source source(given.input, given.raw, nullptr, {.upright = !given.noRotate});
     if (!given.stream) given.outputs = std::make_shared<Outputs>(given.output, "-o", source.files(), policy);
     if (source.decoder().nrStreams(1) == 0) throw failure(Msg::fileNoPicture, {given.input});
     source.selectAll();

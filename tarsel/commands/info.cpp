@@ -289,7 +289,7 @@ Json showTask(const std::string& name, bool json) {
 struct Given {
     std::vector<std::string> files;
     std::string raw, inputFormat;
-    bool json = false;
+    bool json = false, exact = false;
 };
 
 // Looks at every file, also after one that can't be used.
@@ -303,7 +303,7 @@ void info(const Given& given) {
                 all.push_back(showTask(name, given.json));
                 continue;
             }
-            const Source source(name, given.raw, standard.get(), Source::Turned::asCoded);
+            const Source source(name, given.raw, standard.get(), {.upright = false, .exact = given.exact});
             all.push_back(describe(source));
             if (!given.json) printFile(all.back());
             if (all.back().contains("damage"))
@@ -333,5 +333,6 @@ void addInfo(CommandLine& line) {
                    "What the standard input holds, as an extension: wav, ...", "EXT");
     command.option("--raw", given->raw, "Format of a raw file: size=WxH,pixel=FORMAT,rate=R", "K=V,...");
     command.flag("--json", given->json, "Print JSON, one array of files");
+    command.flag("--exact", given->exact, "Read all of a film, also where its tables say what is in it");
     command.action([given] { info(*given); });
 }

@@ -120,9 +120,8 @@ std::unique_ptr<Source> Job::openInput(const std::string& name) {
     if (standard && options_.joins()) throw failure(Msg::stdinRefuses, {options_.join ? "--join" : "--cut"});
     const bool isRaw = onlyOne || !Source::describesItself(standard ? name + "." + standard->format() : name);
     rawTaken_ |= isRaw;
-    auto source =
-        std::make_unique<Source>(name, isRaw ? options_.raw : "", standard,
-                                 options_.noRotate ? Source::Turned::asCoded : Source::Turned::upright);
+    auto source = std::make_unique<Source>(name, isRaw ? options_.raw : "", standard,
+                                           Source::Films{.upright = !options_.noRotate});
     source->selectAll();
     return source;
 }

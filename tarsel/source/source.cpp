@@ -131,7 +131,7 @@ AnyDict stateOf(const QvCodec& codec) {
     return state;
 }
 
-Source::Source(const std::string& spec, const std::string& raw, StandardInput* standard, Turned turned)
+Source::Source(const std::string& spec, const std::string& raw, StandardInput* standard, const Films& films)
     : name_(spec), formatName_(spec) {
     if (isGenerator(spec)) {
         isFile_ = false;
@@ -139,7 +139,7 @@ Source::Source(const std::string& spec, const std::string& raw, StandardInput* s
         openGenerator(spec);
     } else if (spec == StandardInput::kName) {
         takeStandard(standard, !raw.empty());
-        raw.empty() ? openFile(turned) : openRaw(raw);
+        raw.empty() ? openFile(films) : openRaw(raw);
     } else if (raw.empty() && isCardFolder(spec)) {
         decoder_ = openCard(spec);
         name_ = decoder_->QvCodec::getParam("filename").toString().asString("");
@@ -147,7 +147,7 @@ Source::Source(const std::string& spec, const std::string& raw, StandardInput* s
     } else {
         files_.push_back(spec);
         requireInput(spec);
-        raw.empty() ? openFile(turned) : openRaw(raw);
+        raw.empty() ? openFile(films) : openRaw(raw);
     }
     open_ = decoder_.get();
     takeMixed();
@@ -333,12 +333,12 @@ void Source::takeMixed() {
     for (const std::string& file : inputFilesOf(*open_)) files_.push_back(file);
 }
 
-void Source::openFile(Turned turned) {
+void Source::openFile(const Films& films) {
     if (isMixName(formatName_)) decoder_ = openViews(name_);
     if (!decoder_ && isMixName(formatName_)) decoder_ = openMix(name_);
     if (decoder_) return;
     Any params = openParameters(formatName_);
-    if (turned == Turned::upright && isFilm(formatName_)) params = AnyDict("upright", 1);
+    if (isFilm(formatName_)) params = AnyDict("upright", films.upright ? 1 : 0, "exact", films.exact ? 1 : 0);
     Any error;
     if (standard_) {
         requireDecoder();

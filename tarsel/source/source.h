@@ -15,10 +15,13 @@ class Source {
     // `spec`: a file name, "testgen:size=1280x720,rate=25,duration=10", or "-" for `standard`, which then
     // outlives this; null where the standard input is not taken. `raw`: the format of a raw file
     // ("size=352x288,pixel=I420,rate=25"), empty to open by extension. Throws Failure.
-    // Films are turned as they say that they are to be shown, unless they are wanted as coded.
-    enum class Turned { upright, asCoded };
+    // How films are read.
+    struct Films {
+        bool upright = true;  // turned as they say that they are to be shown
+        bool exact = false;   // counted packet by packet, also where tables say how many there are
+    };
     Source(const std::string& spec, const std::string& raw, StandardInput* standard = nullptr,
-           Turned turned = Turned::upright);
+           const Films& films = {true, false});
     // One that is open already; it has to outlive this.
     explicit Source(QvDecodePipe& decoder);
     // The same for a decoder that reads others.
@@ -57,7 +60,7 @@ class Source {
   private:
     void openGenerator(const std::string& spec);
     void openRaw(const std::string& raw);
-    void openFile(Turned turned);
+    void openFile(const Films& films);
     void takeStandard(StandardInput* standard, bool isRaw);
     void takeMixed();  // the files of a mix
     std::string requireDecoder() const;

@@ -43,6 +43,12 @@ constexpr QvParamRow<Settings> rows[] = {
      .min = 0,
      .max = 1,
      .help = "1: pictures are turned as the film says; 0: they are as they are coded"},
+    {.name = "exact",
+     .member = &Settings::exact,
+     .flags = qvParamPlain,
+     .min = 0,
+     .max = 1,
+     .help = "1: packets are counted by reading all of the file; 0: by its table, where it has a whole one"},
     {.name = "container",
      .member = &Settings::container,
      .flags = qvParamStored,
@@ -111,7 +117,7 @@ int AvDec::openFilm() {
     }
     const auto input = MediaInput::open(*bytes_, settings_.container, reason);
     if (!input) return refuse(reason);
-    index_ = PacketIndex::build(*input, reason);
+    index_ = PacketIndex::build(*input, reason, settings_.exact != 0);
     if (!index_) return refuse(reason);
     addStreams(*input, reason);
     if (streams().empty()) return refuse(reason.empty() ? "it has neither pictures nor sound" : reason);

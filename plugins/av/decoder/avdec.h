@@ -7,7 +7,8 @@
 // Parameters: "source" (in the place of the file, see QvByteSource; it has to be sought), "threads" (stored;
 // of each stream's codec, 0: one a core), "upright" (stored; 1: frames are delivered as the film is to be
 // shown, turned and mirrored, and "rotation" and "mirrored" are absent then; 0, as it is at first: as they
-// are coded), "container" (stored; the libraries' name of the format, "": found out), "openParameters" and
+// are coded), "exact" (1: packets are counted by reading all of the file, also where a table says how many
+// there are), "container" (stored; the libraries' name of the format, "": found out), "openParameters" and
 // "settings" (a Dict of these).
 //
 // A stream of pictures has, besides what the contract asks for:
@@ -54,6 +55,7 @@ class AvDec : public BaseDecodePipe {
         QvByteSource* source = nullptr;  // borrowed; null: the file
         int threads = 0;
         int upright = 0;
+        int exact = 0;
         std::string container;
     };
 

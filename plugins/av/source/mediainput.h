@@ -61,8 +61,9 @@ class MediaInput {
     void selectOnly(int stream);
 
     // Where the container has one table of all packets: from here to the next rewind packets come as they do
-    // else, but their bytes are not read from the file, and are anything. False where it has none, or where
-    // the library needs the bytes to say what the packets are.
+    // else, but their bytes are not read from the file, and are anything; which of them are keys is the
+    // table's word then, and not the codec's. False where there is no such table, or where the library needs
+    // the bytes to say what the packets are.
     bool leaveBytes();
 
     enum class Read { packet, end, failed };

@@ -1,0 +1,69 @@
+#include "plugins/av/index/packetindex.h"
+
+#include "core/value/any.h"
+#include "plugins/av/source/avheaders.h"
+#include "plugins/av/source/mediainput.h"
+#include "tests/plugins/av/films.h"
+#include "tests/plugins/av/watchedsource.h"
+#include "tests/support/engine.h"
+
+namespace {
+
+class IndexOfFilms : public Films {
+  protected:
+    // The packets of all streams as numbers, and the damage. Which ones are keys is the table's word, or that
+    // of the packets' own bytes: both do to start at.
+    std::string build(WatchedSource& source, const std::string& name, bool whole) {
+        const av::MediaBytes bytes(source, Any(name.c_str()));
+        std::string reason;
+        const auto input = av::MediaInput::open(bytes, "", reason);
+        if (!input) return reason;
+        source.taken = 0;
+        const auto index = av::PacketIndex::build(*input, reason, whole);
+        if (!index) return reason;
+        std::string text = index->damage();
+        for (unsigned i = 0; i < input->context().nb_streams; ++i)
+            for (const av::IndexedPacket& p : index->packets(static_cast<int>(i)))
+                for (const long long number :
+                     {static_cast<long long>(p.pts), static_cast<long long>(p.dts),
+                      static_cast<long long>(p.position), static_cast<long long>(p.duration),
+                      static_cast<long long>(p.flags & ~1u), static_cast<long long>(p.skipAtStart),
+                      static_cast<long long>(p.skipAtEnd), static_cast<long long>(p.bytes),
+                      static_cast<long long>(p.samples)})
+                    text += std::to_string(number) + ' ';
+        return text;
+    }
+
+    EngineScope engine_;
+};
+
+TEST_F(IndexOfFilms, tablesGiveWhatAPassGivesWithoutTheBytes) {
+    const std::string source = "testsrc2=size=320x240:rate=25:duration=8[out0];sine=duration=8[out1]";
+    const struct {
+        const char* name;
+        Words options;
+        bool table;
+    } cases[] = {
+        {"b.mp4", {"-c:v", "mpeg4", "-b:v", "4M", "-bf", "2", "-c:a", "aac"}, true},
+        {"fast.mp4", {"-c:v", "mpeg4", "-b:v", "4M", "-c:a", "aac", "-movflags", "+faststart"}, true},
+        {"pcm.mov", {"-c:v", "mjpeg", "-q:v", "3", "-c:a", "pcm_s16le", "-timecode", "01:00:00:00"}, true},
+        {"mp3.mov", {"-c:v", "mpeg4", "-c:a", "mp3"}, false},
+        {"parts.mp4", {"-c:v", "mpeg4", "-c:a", "aac", "-movflags", "+frag_keyframe+empty_moov"}, false},
+        {"both.mp4", {"-c:v", "mpeg4", "-c:a", "aac", "-movflags", "+frag_keyframe"}, false},
+        {"film.mkv", {"-c:v", "mpeg4", "-c:a", "aac"}, false},
+    };
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.name);
+        const std::string bytes = TempFolder::read(film(c.name, c.options, source));
+        for (const std::size_t length : {bytes.size(), bytes.size() * 7 / 10}) {
+            WatchedSource film(bytes.substr(0, length));
+            const std::string pass = build(film, c.name, true);
+            EXPECT_EQ(build(film, c.name, false), pass);
+            if (c.table && pass.size() > 1000) {
+                EXPECT_LT(film.taken, length / 4);
+            }
+        }
+    }
+}
+
+}  // namespace
