@@ -11,6 +11,7 @@
 #include "tarsel/source/captionfile.h"
 #include "tarsel/source/mixfile.h"
 #include "tarsel/source/picturefile.h"
+#include "tarsel/source/picturefiles.h"
 #include "tarsel/source/viewfile.h"
 #include "tarsel/source/wavformat.h"
 #include "tarsel/words/keyvalues.h"
@@ -145,9 +146,10 @@ Source::Source(const std::string& spec, const std::string& raw, StandardInput* s
         name_ = decoder_->QvCodec::getParam("filename").toString().asString("");
         files_.push_back(name_);
     } else {
-        files_.push_back(spec);
-        requireInput(spec);
-        raw.empty() ? openFile(films) : openRaw(raw);
+        if (const auto pictures = pictureFiles(spec)) takePictures(*pictures, raw);
+        files_.push_back(name_);
+        requireInput(name_);
+        raw.empty() || pictures_.isSet("pictures") ? openFile(films) : openRaw(raw);
     }
     open_ = decoder_.get();
     takeMixed();
@@ -183,6 +185,16 @@ bool Source::describesItself(const std::string& spec) {
     if (isGenerator(spec)) return true;
     const Any ext = QvFile::getExt(Any(spec.c_str()), true);
     return !qv_registry()->decoders(ext.asString()).empty();
+}
+
+// The first of them stands for all.
+void Source::takePictures(const PictureFiles& pictures, const std::string& raw) {
+    name_ = formatName_ = pictures.first;
+    pictures_ = AnyDict("pictures", pictures.count);
+    if (raw.empty()) return;
+    const KeyValues keys(raw, {"rate"}, "--raw");
+    if (const std::string* rate = keys.find("rate"))
+        pictures_.set("framerate", Any(parseRate(*rate, "--raw rate")));
 }
 
 void Source::refuse(const std::string& why) const { throw failure(Msg::inputRefused, {name_, why}); }
@@ -316,6 +328,7 @@ void Source::refuseFile(const std::string& decoder, const std::string& reason) c
         if (!codec) throw failure(Msg::inputNoDecoder, {name_});
         if (decoder == "sccdec" || decoder == "wavdec")
             codec->setParam("openParameters", openParameters(name_));
+        if (pictures_.isSet("pictures") && decoder == "avdec") codec->setParam("openParameters", pictures_);
         codec->setParam("filename", name_.c_str());
         if (codec->open() != QvStatus::ok) why = codec->errorDesc();
     }
@@ -339,6 +352,10 @@ void Source::openFile(const Films& films) {
     if (decoder_) return;
     Any params = openParameters(formatName_);
     if (isFilm(formatName_)) params = AnyDict("upright", films.upright ? 1 : 0, "exact", films.exact ? 1 : 0);
+    if (pictures_.isSet("pictures")) {
+        params = pictures_;
+        params.asDict().set("upright", films.upright ? 1 : 0);
+    }
     Any error;
     if (standard_) {
         requireDecoder();

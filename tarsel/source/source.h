@@ -9,6 +9,7 @@
 #include <qvplugcore/qvplugcore.h>
 
 class StandardInput;
+struct PictureFiles;
 
 class Source {
   public:
@@ -61,6 +62,7 @@ class Source {
     void openGenerator(const std::string& spec);
     void openRaw(const std::string& raw);
     void openFile(const Films& films);
+    void takePictures(const PictureFiles& pictures, const std::string& raw);
     void takeStandard(StandardInput* standard, bool isRaw);
     void takeMixed();  // the files of a mix
     std::string requireDecoder() const;
@@ -71,6 +73,7 @@ class Source {
     std::string name_;
     std::string formatName_;  // whose extension says what it holds
     bool isFile_ = true;
+    AnyDict pictures_;  // with which a file and those after it are opened as pictures; empty for a film
     std::vector<std::string> files_;
     StandardInput* standard_ = nullptr;
     std::unique_ptr<QvByteSource> bytes_;    // outlives the decoder that reads it

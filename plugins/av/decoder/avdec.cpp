@@ -11,6 +11,7 @@
 #include "plugins/av/decoder/filmfacts.h"
 #include "plugins/av/decoder/filmlength.h"
 #include "plugins/av/decoder/filmstreams.h"
+#include "plugins/av/decoder/picturefiles.h"
 #include "plugins/av/index/packetindex.h"
 #include "plugins/av/source/avheaders.h"
 
@@ -49,6 +50,17 @@ constexpr QvParamRow<Settings> rows[] = {
      .min = 0,
      .max = 1,
      .help = "1: packets are counted by reading all of the file; 0: by its table, where it has a whole one"},
+    {.name = "pictures",
+     .member = &Settings::pictures,
+     .flags = qvParamStored,
+     .min = 0,
+     .max = 10'000'000,
+     .help =
+         "how many files, counted on from the number in the name, are a frame each; 0: the file is a film"},
+    {.name = "framerate",
+     .member = &Settings::rate,
+     .flags = qvParamStored,
+     .help = "of frames that are files"},
     {.name = "container",
      .member = &Settings::container,
      .flags = qvParamStored,
@@ -81,6 +93,8 @@ int AvDec::setParam(const char* name, const Any& value) {
 void AvDec::getParam(const char* name, Any& value) const {
     if (std::strcmp(name, "filesize") == 0) {
         value = fileSize_;
+    } else if (std::strcmp(name, "inputFiles") == 0 && settings_.pictures > 0) {
+        value = inputFiles_;
     } else if (std::strcmp(name, "meta") == 0) {
         value = facts_;
     } else if (std::strcmp(name, "store") == 0) {
@@ -104,7 +118,20 @@ int AvDec::open() {
     if (getState() == stateOpen) close();
     bytes_ = settings_.source ? std::make_unique<MediaBytes>(*settings_.source, filename())
                               : std::make_unique<MediaBytes>(filename());
-    return openFilm();
+    return settings_.pictures > 0 ? openPictures() : openFilm();
+}
+
+int AvDec::openPictures() {
+    const Any name = filename().toString();
+    const auto files = numberedFrom(name.asString(""), settings_.pictures);
+    if (files.empty()) return refuse("its name has no number to count from");
+    std::string reason;
+    auto pictures = PictureFiles::open(files, settings_.rate, settings_.upright != 0, reason);
+    if (!pictures) return refuse(reason);
+    inputFiles_.clear();
+    for (const std::string& file : files) inputFiles_.append(Any(file.c_str()));
+    addStream(std::make_unique<PictureStream>(std::move(pictures), nullptr));
+    return BaseDecodePipe::open();
 }
 
 int AvDec::openFilm() {
@@ -150,7 +177,7 @@ void AvDec::addStreams(MediaInput& input, std::string& reason) {
             if (settings_.upright && reader->format().turn.any())
                 qv_log()->warning("Stream %u of '%s' is not turned upright: its pixel format can't be turned",
                                   i, filename().toString().asString(""));
-            auto* const added = addStream(std::make_unique<PictureStream>(std::move(reader), stream));
+            auto* const added = addStream(std::make_unique<PictureStream>(std::move(reader), &stream));
             const PictureFormat& format = added->reader().format();
             if (!covers && length.isCut(stream))
                 added->setTruncated(length.announced(stream, format.rate.rate().ratio(), format.frames));

@@ -8,8 +8,9 @@
 // of each stream's codec, 0: one a core), "upright" (stored; 1: frames are delivered as the film is to be
 // shown, turned and mirrored, and "rotation" and "mirrored" are absent then; 0, as it is at first: as they
 // are coded), "exact" (1: packets are counted by reading all of the file, also where a table says how many
-// there are), "container" (stored; the libraries' name of the format, "": found out), "openParameters" and
-// "settings" (a Dict of these).
+// there are), "pictures" (stored; N above 0: the file and those that follow it by number, N in all, are the
+// frames, a picture each) and "framerate" (stored; theirs, 25 at first), "container" (stored; the libraries'
+// name of the format, "": found out), "openParameters" and "settings" (a Dict of these).
 //
 // A stream of pictures has, besides what the contract asks for:
 //
@@ -38,6 +39,7 @@
 #include <string>
 
 #include "core/decode/basedecodepipe.h"
+#include "core/measure/qvframerate.h"
 #include "plugins/av/source/mediainput.h"
 
 class QvByteSource;
@@ -56,6 +58,8 @@ class AvDec : public BaseDecodePipe {
         int threads = 0;
         int upright = 0;
         int exact = 0;
+        int pictures = 0;
+        QvFramerate rate{25.0};
         std::string container;
     };
 
@@ -76,12 +80,14 @@ class AvDec : public BaseDecodePipe {
     std::unique_ptr<MediaBytes> bytes_;
     std::shared_ptr<const PacketIndex> index_;
     AnyDict facts_;
+    AnyVector inputFiles_;  // of pictures that are files
     long long fileSize_ = -1;
 
     int setAll(const Any& value);
     int refuse(const std::string& reason);
     void addStreams(MediaInput& input, std::string& reason);
     int openFilm();
+    int openPictures();
 };
 
 }  // namespace av

@@ -30,7 +30,7 @@ void describeStream(const AVStream& stream, AnyDict& params) {
     if (stream.id > 0) params.set("codecParams", AnyDict("pid", stream.id));
 }
 
-PictureStream::PictureStream(std::unique_ptr<FrameReader> reader, const AVStream& stream)
+PictureStream::PictureStream(std::unique_ptr<PictureSource> reader, const AVStream* stream)
     : reader_(std::move(reader)) {
     const PictureFormat& format = reader_->format();
     params.set("FOURCC", format.fourcc);
@@ -54,7 +54,7 @@ PictureStream::PictureStream(std::unique_ptr<FrameReader> reader, const AVStream
     if (format.space != 0) params.set("colourSpace", format.space);
     if (format.variable) params.set("variableRate", 1);
     if (!format.lost.empty()) params.set("conversion", Any(format.lost.c_str()));
-    describeStream(stream, params);
+    if (stream) describeStream(*stream, params);
 }
 
 int PictureStream::read() {

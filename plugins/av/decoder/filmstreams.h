@@ -18,18 +18,19 @@ void describeStream(const AVStream& stream, AnyDict& params);
 
 class PictureStream : public DPipeVideoStream {
   public:
-    PictureStream(std::unique_ptr<FrameReader> reader, const AVStream& stream);
+    // `stream` of the container; null without one.
+    PictureStream(std::unique_ptr<PictureSource> reader, const AVStream* stream);
 
     int read();  // as readFrame
     bool seek(long long frame) {
         return frame >= 0 && frame <= reader_->format().frames && reader_->seek(static_cast<int>(frame));
     }
-    FrameReader& reader() { return *reader_; }
+    PictureSource& reader() { return *reader_; }
     // The file was cut, or is damaged. Nothing changes if it has what it announces all the same.
     void setTruncated(long long expected);
 
   private:
-    std::unique_ptr<FrameReader> reader_;
+    std::unique_ptr<PictureSource> reader_;
     int concealed_ = 0;
 };
 

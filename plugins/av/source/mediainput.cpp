@@ -159,6 +159,10 @@ bool isKnownByTable(const AVCodecParameters& codec) {
     return codec.codec_id >= AV_CODEC_ID_FIRST_AUDIO && codec.codec_id < AV_CODEC_ID_ADPCM_IMA_QT;
 }
 
+bool isPicture(const std::string& name) {
+    return av_match_ext(name.c_str(), "png,jpg,jpeg,tif,tiff,dpx,exr") != 0;
+}
+
 // Program and transport streams.
 bool isCutByParser(const AVFormatContext& context) {
     const std::string name = context.iformat->name;
@@ -245,7 +249,9 @@ int MediaInput::State::open(const MediaBytes& from, const std::string& format) {
     const AVInputFormat* forced = nullptr;
     if (!format.empty() && !(forced = av_find_input_format(format.c_str()))) return AVERROR_DEMUXER_NOT_FOUND;
     const Any name = from.name().toString();
-    int result = avformat_open_input(&context, name.asString(""), forced, nullptr);
+    // By the name of a picture the library would look for others of such names.
+    int result =
+        avformat_open_input(&context, isPicture(name.asString("")) ? "" : name.asString(""), forced, nullptr);
     if (result >= 0) result = avformat_find_stream_info(context, nullptr);
     return result;
 }

@@ -1,4 +1,6 @@
 // Films through the tool, with the plug-in that it loads by itself.
+#include <filesystem>
+
 #include <gmock/gmock.h>
 
 #include "tests/plugins/av/films.h"
@@ -184,6 +186,42 @@ TEST_F(FilmsInTheTool, sayOfThemselvesWhatTheyCarry) {
                                  R"("language": "eng")", R"("profile": "AC-3")", R"("bit_rate": 448000)"})
             EXPECT_THAT(json.out, HasSubstr(part));
     }
+}
+
+TEST_F(FilmsInTheTool, areMadeOfNumberedPictures) {
+    const std::string plain =
+        film("plain.mkv", {"-c:v", "ffv1", "-pix_fmt", "bgra"}, "testsrc2=size=96x64:rate=25:duration=0.4");
+    const std::string expected = pictures(plain, "bgra");
+    const std::size_t size = 96 * 64 * 4;
+    ASSERT_EQ(ffmpeg({"-i", plain, "-start_number", "8", folder.file("a%03d.png")}).status, 0);
+    ASSERT_EQ(ffmpeg({"-i", plain, folder.file("b%d.jpg")}).status, 0);
+    ASSERT_EQ(ffmpeg({"-i", plain, folder.file("c%02d.dpx")}).status, 0);
+    const struct {
+        Words words;
+        std::string expected;
+    } cases[] = {
+        {{"a%03d.png"}, expected},
+        {{"a[009-011].png"}, expected.substr(size, 3 * size)},
+        {{"a%03d.png", "--from", "4f", "--to", "7f"}, expected.substr(4 * size, 3 * size)},
+        {{"a%03d.png", "--cut", "7f-8f", "--cut", "1f-2f"},
+         expected.substr(7 * size, size) + expected.substr(size, size)},
+        {{"c%02d.dpx"}, expected},
+    };
+    for (const auto& c : cases) {
+        Words words = {"transcode", "-y", "-o", "out.bgr4", "--pixel", "BGR4"};
+        words.insert(words.end(), c.words.begin(), c.words.end());
+        const Outcome made = tarsel(words);
+        EXPECT_EQ(made.status, 0) << made.err;
+        EXPECT_TRUE(TempFolder::read(folder.file("out.bgr4")) == c.expected) << c.words.back();
+    }
+    EXPECT_THAT(tarsel({"info", "--raw", "rate=24", "b%d.jpg"}).out,
+                testing::AllOf(HasSubstr("24 fps"), HasSubstr("10 frames")));
+    EXPECT_EQ(tarsel({"transcode", "a%03d.png", "-y", "-o", "k.bgr4", "--save-task", "k.xml"}).status, 0);
+    EXPECT_EQ(tarsel({"run", "-y", "k.xml"}).status, 0);
+    std::filesystem::remove(folder.file("a012.png"));
+    const Outcome missing = tarsel({"transcode", "a%03d.png", "-y", "-o", "out.bgr4"});
+    EXPECT_EQ(missing.status, 3);
+    EXPECT_THAT(missing.err, HasSubstr("a012.png"));
 }
 
 TEST_F(FilmsInTheTool, keepTheirFieldsAndAspect) {
