@@ -110,7 +110,7 @@ int JoinPlanner::inputNumber(const std::string& name) {
     names_.push_back(name);
     numbers_.emplace(name, number);
     inputs_.push_back(readInput(*source));
-    join_.inputs.push_back(storedInput(*source, name, segmentCount() == 1));
+    join_.inputs.push_back(storedInput(*source, source->name(), segmentCount() == 1));
     files_.insert(files_.end(), source->files().begin(), source->files().end());
     return number;
 }
