@@ -119,6 +119,43 @@ TEST_F(FilmsInTheTool, thatWereCutGiveWhatIsThere) {
     }
 }
 
+TEST_F(FilmsInTheTool, whoseHeadersStateMoreThanIsThereAreRefused) {
+    const struct {
+        const char* name;
+        Words options;
+    } cases[] = {
+        {"cut.flac", {"-c:a", "flac"}},
+        {"cut.aiff", {}},
+        {"cut.au", {}},
+        {"cut.caf", {"-c:a", "pcm_s16le"}},
+        {"cut.mxf",
+         {"-f", "lavfi", "-i", "testsrc2=size=96x64:duration=8", "-c:v", "mpeg2video", "-c:a", "pcm_s16le",
+          "-ar", "48000"}},
+        {"cut.mp4", {"-c:a", "aac", "-movflags", "+empty_moov", "-frag_duration", "500000"}},
+    };
+    for (const auto& c : cases) {
+        const std::string bytes = TempFolder::read(film(c.name, c.options, "sine=duration=8"));
+        EXPECT_EQ(tarsel({"transcode", c.name, "-y", "-o", "x.avi", "--muxer", "nullmux"}).status, 0)
+            << c.name;
+        folder.write(c.name, bytes.substr(0, bytes.size() / 20 * 11));
+        EXPECT_EQ(tarsel({"transcode", c.name, "-y", "-o", "x.avi", "--muxer", "nullmux"}).status, 3)
+            << c.name;
+        const Outcome taken =
+            tarsel({"transcode", "--accept-partial", c.name, "-y", "-o", "x.avi", "--muxer", "nullmux"});
+        EXPECT_EQ(taken.status, 0) << c.name << taken.err;
+    }
+}
+
+TEST_F(FilmsInTheTool, whosePicturesAreDamagedSayHowMany) {
+    std::string bytes = TempFolder::read(film("film.avi", {"-c:v", "mjpeg"}));
+    for (std::size_t at = bytes.size() / 2; at < bytes.size() / 2 + 1500; ++at) bytes[at] = 0;
+    folder.write("film.avi", bytes);
+    const Outcome o =
+        tarsel({"transcode", "--accept-partial", "film.avi", "-o", "x.avi", "--muxer", "nullmux"});
+    EXPECT_EQ(o.status, 0) << o.err;
+    EXPECT_THAT(o.err, HasSubstr("could not be decoded"));
+}
+
 TEST_F(FilmsInTheTool, bringTheirSound) {
     const std::string file = folder.file("film.mkv");
     ASSERT_EQ(ffmpeg({"-f", "lavfi", "-i", kMoving, "-f", "lavfi", "-i", "sine=frequency=440:duration=2",
