@@ -27,7 +27,7 @@ struct Given {
 };
 
 void check(const StoredTask& task) {
-    AnyDict state = task.state();
+    AnyDict state = task.enabled();
     changeTaskFiles(state, [](const std::string& name, TaskFileUse use) {
         if (use == TaskFileUse::input) requireInput(name);
         if (use == TaskFileUse::filterReads) requireFile(name);

@@ -200,7 +200,10 @@ std::vector<std::string> Job::filesRead() const {
     std::vector<std::string> files = parts_.plan.filterFiles.read;
     for (const auto& source : parts_.sources)
         files.insert(files.end(), source->files().begin(), source->files().end());
-    if (parts_.stored && !options_.joins()) files.push_back(parts_.stored->name());
+    if (!parts_.stored || options_.joins()) return files;
+    files.push_back(parts_.stored->name());
+    const std::vector<std::string> named = parts_.stored->allInputs();
+    files.insert(files.end(), named.begin(), named.end());
     return files;
 }
 

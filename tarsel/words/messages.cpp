@@ -112,7 +112,7 @@ constexpr Message kMessages[] = {
     {Msg::atAfterEnd,     Exit::usage, "--at {text}",                 "it is after the end of {file} ({text})",      "give an earlier time"},
     {Msg::toAfterEnd,     Exit::done,  "{option} {text}",             "it is after the end of {file} ({text})",      "stopped at the end"},
     {Msg::durationAfterEnd, Exit::done, "--duration {text}",          "from {text} it is after the end of {file} ({text})", "stopped at the end"},
-    {Msg::noFrameBetween, Exit::usage, "can't take a part of {file}", "there is no frame between {text} and {text}", "move --from or --to"},
+    {Msg::noFrameBetween, Exit::usage, "can't take a part of {file}", "there is no frame between {text} and {text}", "take a longer part"},
     {Msg::durationNone,   Exit::usage, "--duration",                  "{name} is no length",                         "give more than 0"},
     // pictures
     {Msg::fitWrong,               Exit::usage,  "{option}",                         "{name} is not a box for the picture",                          "use WxH, WxH,bars or WxH,crop"},

@@ -123,6 +123,31 @@ TEST_F(Task, ACommandRunsOnlyWhenItIsAllowed) {
               (folder.path() / "out.wav").string() + " " + (folder.path() / "in.wav").string() + "\n");
 }
 
+// Segments that are switched off are not read, and neither are files that no segment uses any more.
+TEST_F(Task, OnlyWhatIsReadHasToBeThere) {
+    folder.write("off.wav", contents("in.wav"));
+    works({"transcode", "--join", "in.wav", "off.wav", "-o", "out.wav", "--save-task", "job.xml"});
+    std::string task = contents("job.xml");
+    const std::size_t streams = task.rfind("  <key>streams</key>");
+    task.insert(streams, "<key>segments</key><vec><i32>1</i32><i32>0</i32></vec>");
+    folder.write("half.xml", task);
+    task = contents("job.xml");
+    const std::size_t second = task.rfind("<dict>", task.rfind("off.wav"));
+    task.erase(second, task.find("</vec>", second) - second);
+    folder.write("one.xml", task);
+    const std::string name = folder.file("off.wav");
+    for (const char* file : {"half.xml", "one.xml"}) {
+        fails(4, {"run", file, "-o", "off.wav", "-y"}, {"'off.wav'", "input"});
+        std::filesystem::rename(name, name + "-");
+        works({"task", "check", file});
+        works({"run", file, "-y"});
+        EXPECT_EQ(contents("out.wav").substr(80), contents("in.wav").substr(44)) << file;
+        std::filesystem::rename(name + "-", name);
+    }
+    std::filesystem::remove(name);
+    fails(3, {"run", "job.xml", "-y"}, {"off.wav"});
+}
+
 // The input was replaced by one that has less.
 TEST_F(Task, AnInputThatLacksAStreamIsNamed) {
     works(Words{"transcode"} + kCard + Words{"-o", "card.avi", "--save-task", "job.xml", "--dry-run"});

@@ -129,7 +129,9 @@ int setBits(S& s, const Any& value) {
 int setOptionText(S& s, const Any& value) {
     std::string wanted;
     const AVCodec* const library = s.codec->library();
-    if (!library || !qvparam::convert(value, wanted) || !checkOptions(*library, wanted).empty())
+    if (!qvparam::convert(value, wanted)) return QvStatus::invalidParam;
+    // Uncompressed sound has no library, and none is needed for no options.
+    if (!wanted.empty() && (!library || !checkOptions(*library, wanted).empty()))
         return QvStatus::invalidParam;
     s.options = wanted;
     return QvStatus::ok;

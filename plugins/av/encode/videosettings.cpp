@@ -258,8 +258,9 @@ const Row commonRows[] = {
      .member = Access{[](S& s, const Any& value) {
                           std::string wanted;
                           const AVCodec* const library = s.codec->library();
-                          if (!library || !qvparam::convert(value, wanted)) return QvStatus::invalidParam;
-                          if (!checkOptions(*library, wanted).empty()) return QvStatus::invalidParam;
+                          if (!qvparam::convert(value, wanted)) return QvStatus::invalidParam;
+                          if (!wanted.empty() && (!library || !checkOptions(*library, wanted).empty()))
+                              return QvStatus::invalidParam;
                           s.options = wanted;
                           return QvStatus::ok;
                       },

@@ -89,9 +89,7 @@ size_t JoinPlanner::segmentCount() const {
     return options_.join ? options_.inputs.size() : options_.cuts.size();
 }
 
-bool JoinPlanner::levelIsCommon() const {
-    return !options_.sound.normalize.empty() && segmentCount() > 1;
-}
+bool JoinPlanner::levelIsCommon() const { return !options_.sound.normalize.empty() && segmentCount() > 1; }
 
 std::unique_ptr<JoinLevel> JoinPlanner::level() const {
     if (!levelIsCommon() || !options_.sound.gains.empty()) return nullptr;

@@ -1,10 +1,10 @@
 #include "tarsel/job/task/storedtask.h"
 
-#include <algorithm>
 #include <cerrno>
 #include <cstring>
 #include <filesystem>
 #include <new>
+#include <unordered_set>
 
 #include "tarsel/host/files.h"
 #include "tarsel/host/memory.h"
@@ -45,6 +45,16 @@ std::unique_ptr<QvDecodePipe> openFile(const QvTaskState& state, const Any& name
         }
     }
     return nullptr;
+}
+
+std::vector<std::string> inputsIn(AnyDict state) {
+    std::vector<std::string> names;
+    std::unordered_set<std::string> known;
+    changeTaskFiles(state, [&](const std::string& name, TaskFileUse use) {
+        if (use == TaskFileUse::input && known.insert(name).second) names.push_back(name);
+        return name;
+    });
+    return names;
 }
 
 std::string fromFolder(const std::string& name, const fs::path& folder) {
@@ -112,16 +122,24 @@ StoredTask::~StoredTask() {
     decoders_.deleteAll();
 }
 
-std::vector<std::string> StoredTask::inputs() const {
-    std::vector<std::string> names;
-    AnyDict state = state_;
-    changeTaskFiles(state, [&](const std::string& name, TaskFileUse use) {
-        if (use == TaskFileUse::input && std::find(names.begin(), names.end(), name) == names.end())
-            names.push_back(name);
-        return name;
-    });
-    return names;
+QvTaskState StoredTask::enabled() const {
+    QvTaskState state = state_;
+    for (int i = state.nrSegments() - 1; i >= 0; --i)
+        if (!state.isSegmentEnabled(i)) state.removeSegment(i);
+    std::unordered_set<std::string> used;
+    for (int i = 0; i < state.streams_in().size(); ++i)
+        for (const Any& source : state.sources(i))
+            if (source.isDict()) used.insert(source.asDict().get("file").toString().asString(""));
+    AnyVector files;
+    for (const Any& file : state.inputFiles())
+        if (used.count(file.asDict().get("filename").toString().asString("")) > 0) files.append(file);
+    state.set("files", files);
+    return state;
 }
+
+std::vector<std::string> StoredTask::inputs() const { return inputsIn(enabled()); }
+
+std::vector<std::string> StoredTask::allInputs() const { return inputsIn(state_); }
 
 std::string StoredTask::output() const { return state_.outputFilename().toString().asString(""); }
 
@@ -153,6 +171,8 @@ std::string StoredTask::missingStream() const {
 
 void StoredTask::open() {
     for (const std::string& name : inputs()) requireInput(name);
+    QvTaskState used = state_;
+    used.set("files", enabled().inputFiles());
     const MemoryWatch memory;
     OpenReport report;
     QvEncodePipe* pipe = nullptr;
@@ -160,9 +180,9 @@ void StoredTask::open() {
     try {
         constexpr int options = QvBatchTask::skipDisabled | QvBatchTask::everySegmentOpens;
         if (isJoin())
-            task_.reset(QvBatchTask::fromState(state_, decoders_, &pipe, options, &report, &error));
+            task_.reset(QvBatchTask::fromState(used, decoders_, &pipe, options, &report, &error));
         else
-            task_.reset(QvTask::fromState(state_, decoders_, &pipe, 0, &report, &error));
+            task_.reset(QvTask::fromState(used, decoders_, &pipe, 0, &report, &error));
     } catch (const QvException&) {
         error = Any();
     }

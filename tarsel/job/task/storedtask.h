@@ -27,9 +27,15 @@ class StoredTask {
     // As it is, without another folder's names in it.
     const AnyDict& raw() const { return raw_; }
 
-    // The files that sources are read from, without generated ones, and the output; "" for none.
+    // The same without the segments that are switched off, and without input files that no other uses: these
+    // need not be there.
+    QvTaskState enabled() const;
+
+    // The files that a run reads its sources from, without generated ones, and the output; "" for none.
     std::vector<std::string> inputs() const;
     std::string output() const;
+    // Also those that a run does not need.
+    std::vector<std::string> allInputs() const;
     // The logs of encoding quality that the file asks for.
     const std::vector<std::string>& qualityLogs() const { return qualityLogs_; }
     // The command that runs afterwards, with its placeholders; "" for none.

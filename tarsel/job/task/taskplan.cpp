@@ -6,11 +6,21 @@
 #include "tarsel/job/plan/filmtags.h"
 #include "tarsel/job/plan/lengths.h"
 #include "tarsel/job/plan/soundplan.h"
+#include "tarsel/presets/outputpreset.h"
 #include "tarsel/words/messages.h"
 
 namespace {
 
 bool has(const QvEncodePipe& pipe, int type) { return pipe.nrStreams(type) > 0; }
+
+// Encoders of a plug-in may write their own files through the multiplexer of raw ones.
+bool isRaw(const QvEncodePipe& pipe) {
+    for (int i = 0; i < pipe.nrStreams(); ++i) {
+        const QvCodec* const encoder = pipe.streamAt(i)->encoder;
+        if (encoder && !isRawEncoder(*encoder)) return false;
+    }
+    return true;
+}
 
 bool isOn(const QvCodec& codec, const char* param) {
     try {
@@ -105,7 +115,7 @@ OutputKind taskOutputKind(const StoredTask& task) {
     const std::string name = muxer ? muxer->name() : "nullmux";
     if (name == "nullmux") return OutputKind::nothing;
     if (name == "rawavimux") return OutputKind::avi;
-    if (name != "rawmux") return OutputKind::module;
+    if (name != "rawmux" || !isRaw(pipe)) return OutputKind::module;
     if (!has(pipe, qvVideoStream)) return OutputKind::wav;
     return isOn(*muxer, "rawAsPng") ? OutputKind::pictures : OutputKind::raw;
 }

@@ -391,6 +391,9 @@ TEST(SoundEncoders, WriteWhatADecoderReads) {
         SCOPED_TRACE(c.module + std::to_string(c.bits));
         const auto encoder =
             made<QvAudioEncoder>(c.module, AnyDict("bitsPerSample", c.bits, "channels", c.channels));
+        AnyDict stored;
+        encoder->store(stored);
+        EXPECT_EQ(encoder->restore(stored), 0) << encoder->errorDesc();
         Collector out;
         encoder->attachOutStream(&out);
         if (encoder->open() != 0) {
