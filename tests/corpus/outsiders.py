@@ -54,7 +54,7 @@ def mediainfo(name):
     video, audio = of["Video"], of["Audio"]
     scan = video.get("ScanType")
     colours = {"BT.709": "bt709", "BT.601": "smpte170m", "BT.470 System B/G": "bt470bg"}
-    return {"size": (int(video["Width"]), int(video["Height"])), "rate": fractions.Fraction(video["FrameRate"]),
+    return {"size": (int(video["Width"]), int(video["Height"])), "rate": fractions.Fraction(video.get("FrameRate", 0)),
             "shape": fractions.Fraction(video["DisplayAspectRatio"]),
             "fields": None if not scan else "" if scan == "Progressive" else "i",
             "order": video.get("ScanOrder"), "colour": colours.get(video.get("matrix_coefficients")),

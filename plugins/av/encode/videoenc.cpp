@@ -247,6 +247,9 @@ std::string VideoEnc::configureRate() {
         c.rc_buffer_size = static_cast<int>(std::min(buffer, 2e9));
     }
     if (constant && is(*s.codec, "mpegvenc")) c.rc_min_rate = c.rc_max_rate;
+    // The others fill no stream up.
+    const bool fills = is(*s.codec, "mpegvenc") || is(*s.codec, "mpeg4venc");
+    if (!constant && fills && most > 0) c.rc_min_rate = static_cast<std::int64_t>(std::min(s.least, target));
     return "";
 }
 
