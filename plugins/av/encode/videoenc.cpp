@@ -176,7 +176,9 @@ std::string VideoEnc::configure(AVPixelFormat layout) {
     c.framerate = {c.time_base.den, c.time_base.num};
     c.sample_aspect_ratio = {1, 1};
     if (s.frameAspect > 0) c.sample_aspect_ratio = av_d2q(s.frameAspect * s.height / s.width, longestPixel);
-    const bool hd = s.matrix == 2 || (s.matrix == 0 && s.height >= hdLines);
+    // What DNxHR says of the colours that RGB becomes is BT.709, whatever the size.
+    const bool dnxRgb = is(*s.codec, "vc3venc") && s.type == QvFourcc::b64a;
+    const bool hd = s.matrix == 2 || (s.matrix == 0 && (s.height >= hdLines || dnxRgb));
     const bool film = s.height == 480 || s.height == 512;
     c.color_range = AVCOL_RANGE_MPEG;
     c.color_primaries = hd ? AVCOL_PRI_BT709 : film ? AVCOL_PRI_SMPTE170M : AVCOL_PRI_BT470BG;
@@ -214,6 +216,13 @@ std::string VideoEnc::describeCodec() {
     if (is(*s.codec, "dvvenc") || is(*s.codec, "dv100venc")) return "";
     const VideoForm& form = *s.codec->form(s.type);
     const std::string profile = form.profile ? form.profile : s.codecProfile;
+    // DNxHR has no fields. DNxHD has them in one size, at the rates of its table.
+    if (is(*s.codec, "vc3venc") && s.rate.interlaced() != 0 && profile.starts_with("dnxhr")) {
+        if (s.width != 1920 || s.height != 1080 || form.fourcc == QvFourcc::b64a)
+            return "DNxHD takes interlaced pictures of 1920x1080 in 4:2:2 alone";
+        c.bit_rate = s.rate.rate().ratio() > 26 ? 220'000'000 : 185'000'000;
+        return set("profile", "dnxhd") ? "" : "There is no profile 'dnxhd'";
+    }
     if (!set("profile", profile)) return "There is no profile '" + profile + "'";
     return "";
 }
