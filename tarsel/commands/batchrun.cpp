@@ -37,8 +37,8 @@ struct Given {
 // --- Some tasks in this process.
 
 void runTasks(const Given& given, const BatchFile& file, Signals& signals) {
-    limitThreads(given.threads);
     TaskRun how;
+    how.job.threads = limitThreads(given.threads);
     how.job.policy = given.outputs.policy();
     how.job.policy.quiet = how.job.quiet = given.quiet;
     how.job.progress = given.progress.mode;

@@ -6,7 +6,9 @@
 #include "tarsel/host/files.h"
 #include "tarsel/host/outputs/outputs.h"
 #include "tarsel/host/signals.h"
+#include "tarsel/presets/encoderoptions.h"
 #include "tarsel/presets/outputpreset.h"
+#include "tarsel/presets/presetchoice.h"
 #include "tarsel/presets/presetimport.h"
 #include "tarsel/presets/presetsearch.h"
 #include "tarsel/presets/presetstore.h"
@@ -28,7 +30,8 @@ struct Given {
     std::string output;
     bool all = false, json = false, overwrite = false;
     // Of save.
-    std::string base, muxer, size, rate, pixel, samplerate, channels, bits;
+    std::string base, muxer, size, rate, pixel, samplerate, channels, bits, vcodec, acodec;
+    EncoderOptions encoders;
     bool noVideo = false, noAudio = false;
 };
 
@@ -124,10 +127,31 @@ std::string infoOf(const OutputPreset& preset, const QvEncodePipe& pipe) {
 }
 
 QvPreset presetOf(const Given& given, const std::string& name) {
-    const OutputPreset base(findPreset(given.base.empty() ? "RAW" : given.base), given.muxer);
+    OutputWish wish;
+    wish.output = name;
+    wish.muxer = given.muxer;
+    wish.video = parseCodec(given.vcodec, qvVideoStream);
+    wish.audio = parseCodec(given.acodec, qvAudioStream);
+    wish.preset = given.base.empty() && !wish.namesCodecs() ? "RAW" : given.base;
+    EncoderOptions encoders = given.encoders;
+    encoders.video = wish.video.settings;
+    encoders.audio = wish.audio.settings;
+    encoders.check();
+    const auto chosen = outputPreset(wish);  // there is one: a preset is named, or a codec is
+    const OutputPreset& base = *chosen;
     const auto pipe = base.makePipe(base.muxer().c_str());
-    if (base.has(qvVideoStream) && !given.noVideo) setPicture(given, base.addStream(*pipe, qvVideoStream));
-    if (base.has(qvAudioStream) && !given.noAudio) setSound(given, base.addStream(*pipe, qvAudioStream));
+    const auto add = [&](int type, bool without, auto set) {
+        if (!base.has(type) || without) {
+            if (const std::string option = encoders.given(type); !option.empty())
+                throw failure(Msg::encoderNoStream, {option, type == qvVideoStream ? "picture" : "sound"});
+            return;
+        }
+        QvEncoder& encoder = base.addStream(*pipe, type);
+        set(given, encoder);
+        setEncoder(encoder, type, encoders, name);
+    };
+    add(qvVideoStream, given.noVideo || wish.video.none, setPicture);
+    add(qvAudioStream, given.noAudio || wish.audio.none, setSound);
     QvPreset preset(pipe.get(), name.c_str());
     preset.setShortName(name.c_str());
     leaveOpen(given, base, preset);
@@ -259,6 +283,15 @@ void addPresets(CommandLine& line, Signals& signals) {
     command.group("Settings that save keeps");
     command.option("--preset", given->base, "The preset that it rests on (RAW)", "NAME");
     command.option("--muxer", given->muxer, "One of those that the preset allows", "NAME");
+    command.option("--vcodec", given->vcodec, "Encoder of the picture; settings as h264:tune=film",
+                   "NAME[:K=V,...]");
+    command.option("--acodec", given->acodec, "Encoder of the sound; settings as aac:profile=1",
+                   "NAME[:K=V,...]");
+    command.option("--crf", given->encoders.crf, "Quality that the picture's encoder keeps", "N");
+    command.option("--bitrate", given->encoders.bitrate, "Bit rate of the picture: 800k, 5M, ...", "RATE");
+    command.option("--audio-bitrate", given->encoders.audioBitrate, "Bit rate of the sound: 128k, ...",
+                   "RATE");
+    command.flag("--two-pass", given->encoders.twoPass, "Read the picture twice");
     command.option("--size", given->size, "Size of the picture", "WxH");
     command.option("--rate", given->rate, "Frames a second: 25, 30000/1001, 25i, pal, ntsc, film", "RATE");
     command.option("--pixel", given->pixel, "Pixel format, see 'tarsel formats'", "FOURCC");

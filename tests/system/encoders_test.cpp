@@ -121,6 +121,37 @@ TEST_F(Encoders, RefuseWhatDoesNotGoTogether) {
     fails(2, coded({"transcode", "-", "--input-format", "wav", "-o", "x.mp4", "--two-pass"}), {"--two-pass"});
 }
 
+TEST_F(Encoders, AreKeptByAPresetOfOnesOwn) {
+    ProcessOptions own = here();
+    own.environment = {"HOME=" + folder.path().string()};
+    const auto run = [&](const Words& words) { return tarsel(coded(words), own); };
+    EXPECT_EQ(run({"presets", "save", "Mine", "--preset", "h264_high", "--vcodec", "h264:tune=film", "--crf",
+                   "30", "--audio-bitrate", "192k"})
+                  .status,
+              0);
+    EXPECT_EQ(
+        run({"presets", "save", "Lossless", "--muxer", "mkvmux", "--vcodec", "ffv1", "--acodec", "flac"})
+            .status,
+        0);
+    const Words card = {"transcode", "testgen:size=64x48,rate=25,duration=0.2", "--match"};
+    EXPECT_EQ(run(card + Words{"--preset", "Mine", "-o", "m.mp4"}).status, 0);
+    EXPECT_EQ(heads(contents("m.mp4")),
+              "mp4mux seekable 1|h264venc crf 30 rate 2000000 tune film|aacaenc crf  rate 192000 tune |");
+    EXPECT_EQ(run(card + Words{"--preset", "Lossless", "-o", "l.mkv"}).status, 0);
+    EXPECT_THAT(contents("l.mkv"), AllOf(HasSubstr("ffv1venc"), HasSubstr("flacaenc")));
+    const struct {
+        Words options;
+        const char* part;
+    } wrong[] = {
+        {{"--crf", "20"}, "no encoder has a quality"},
+        {{"--preset", "h264_high", "--vcodec", "ffv1"}, "'H.264 High'"},
+        {{"--preset", "h264_high", "--crf", "99"}, "0 to 51"},
+        {{"--preset", "h264_high", "--acodec", "none", "--audio-bitrate", "64k"}, "no sound"},
+    };
+    for (const auto& row : wrong)
+        EXPECT_THAT(run(Words{"presets", "save", "X"} + row.options).err, HasSubstr(row.part));
+}
+
 // A container goes to a pipe whole, and is told that nobody can go back there.
 TEST_F(Encoders, WriteContainersToPipes) {
     const Outcome o = works(job({"-o", "-", "--format", "mkv"}));

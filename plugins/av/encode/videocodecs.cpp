@@ -52,13 +52,13 @@ constexpr auto rows = std::to_array<VideoCodec>({
     // module    standard  encoder       forms        fourcc  ext     traits
     //   sides least most step   bits low high usual     quality usual most   preset usual        tune    N    M  most M
     {"h264venc",    "",       "libx264",    x264Forms,   "H264", "264",  predictive | interlaced | setsFirst | borrows | statsFile | captions,
-        16, 16384, 2,   32e3, 800e6, 0,       "crf", 21, 51,      "preset", "medium",         "tune", 250, 4, 17, "", "", speeds, x264Tunes},
+        16, 16384, 2,   32e3, 800e6, 0,       "crf", 21, 51,      "preset", "medium",         "tune", 250, 4, 17, "x264-params=force-cfr=1", "", speeds, x264Tunes},
     {"mpegvenc",    "MPEG-2", "mpeg2video", mpeg2Forms,  "MPG2", "m2v",  predictive | interlaced | statsText | captions,
         16, 4096, 2,    100e3, 300e6, 8e6,    "", 0, 0,         "", "",                        "",     15,  3, 8,  "sc_threshold=1000000000", ""},
     {"mpegvenc",    "MPEG-1", "mpeg1video", plainForms,  "MPG1", "m1v",  predictive | statsText,
         16, 4080, 2,    100e3, 100e6, 1.15e6, "", 0, 0,         "", "",                        "",     15,  3, 8,  "sc_threshold=1000000000", ""},
     {"mpeg4venc",   "",       "mpeg4",      plainForms,  "MP4V", "m4v",  predictive | interlaced | setsFirst | statsText,
-        16, 4096, 2,    16e3, 100e6, 2e6,     "", 0, 0,         "", "",                        "",     150, 2, 4,  "sc_threshold=1000000000", ""},
+        16, 4096, 2,    16e3, 100e6, 2e6,     "", 0, 0,         "", "",                        "",     150, 1, 4,  "sc_threshold=1000000000", ""},
     {"vc3venc",     "",       "dnxhd",      dnxForms,    "AVDN", "dnxhd", interlaced | keepsForm,
         256, 8192, 2,   1e6, 2e9, 0,          "", 0, 0,         "", "",                        "",     1,   1, 1,  "", "dnxhr_hq"},
     {"dvvenc",      "",       "dvvideo",    dvForms,     "DVSD", "dv",   interlaced,

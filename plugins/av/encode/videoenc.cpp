@@ -191,7 +191,9 @@ std::string VideoEnc::configure(AVPixelFormat layout) {
     c.framerate = {c.time_base.den, c.time_base.num};
     c.sample_aspect_ratio = {1, 1};
     if (s.frameAspect > 0) c.sample_aspect_ratio = av_d2q(s.frameAspect * s.height / s.width, longestPixel);
-    const bool hd = s.matrix == 2 || (s.matrix == 0 && s.height >= hdLines);
+    // What DNxHR says of the colours that RGB becomes is BT.709, whatever the size.
+    const bool dnxRgb = is(*s.codec, "vc3venc") && s.type == QvFourcc::b64a;
+    const bool hd = s.matrix == 2 || (s.matrix == 0 && (s.height >= hdLines || dnxRgb));
     const bool film = s.height == 480 || s.height == 512;
     c.color_range = AVCOL_RANGE_MPEG;
     c.color_primaries = hd ? AVCOL_PRI_BT709 : film ? AVCOL_PRI_SMPTE170M : AVCOL_PRI_BT470BG;
@@ -266,6 +268,9 @@ std::string VideoEnc::configureRate() {
         c.rc_buffer_size = static_cast<int>(std::min(buffer, 2e9));
     }
     if (constant && is(*s.codec, "mpegvenc")) c.rc_min_rate = c.rc_max_rate;
+    // The others fill no stream up.
+    const bool fills = is(*s.codec, "mpegvenc") || is(*s.codec, "mpeg4venc");
+    if (!constant && fills && most > 0) c.rc_min_rate = static_cast<std::int64_t>(std::min(s.least, target));
     return "";
 }
 

@@ -8,6 +8,7 @@
 #include "tarsel/presets/ranges.h"
 #include "tarsel/source/source.h"
 #include "tarsel/words/messages.h"
+#include "tarsel/words/timespec.h"
 
 namespace {
 
@@ -91,6 +92,9 @@ void PresetPlanner::takeEncoder(PlannedStream& stream) {
         options_.fit(stream.type, stream.part.input, stream.part.stream, encoder);
     stream.set = options_.encoders.text(stream.type);
     setEncoder(encoder, stream.type, options_.encoders, plan_.output.name);
+    if (const std::string& pixel = options_.effects.pixel;
+        stream.isVideo() && !pixel.empty() && !isRawEncoder(encoder))
+        setChecked(encoder, "type", static_cast<int>(parsePixel(pixel, "--pixel")), "--pixel");
 }
 
 PictureFormat PresetPlanner::wanted(const PlannedStream& stream, const QvCodec& encoder, bool& asks) const {

@@ -192,6 +192,7 @@ TEST(VideoEncoders, WriteWhatADecoderReads) {
         {"mpeg4venc", AV_CODEC_ID_MPEG4, I420, 96, 64, 25, 0, 28, AnyDict()},
         {"vc3venc", AV_CODEC_ID_DNXHD, YUYV, 256, 120, 25, 0, 35, AnyDict()},
         {"vc3venc", AV_CODEC_ID_DNXHD, Y216, 256, 120, 25, 0, 35, AnyDict()},
+        {"vc3venc", AV_CODEC_ID_DNXHD, YUYV, 1920, 1080, 25, 1, 35, AnyDict()},
         {"dvvenc", AV_CODEC_ID_DVVIDEO, YUYV, 720, 576, 25, 2, 30, AnyDict()},
         {"dvvenc", AV_CODEC_ID_DVVIDEO, YUYV, 720, 480, 29.97, 2, 30, AnyDict()},
         {"dvvenc", AV_CODEC_ID_DVVIDEO, YUYV, 720, 576, 25, 2, 30, AnyDict("codecProfile", "50")},
