@@ -213,7 +213,8 @@ std::string VideoEnc::configure(AVPixelFormat layout) {
     }
     if (s.codec->has(VideoTrait::setsFirst) || is(*s.codec, "ffv1venc") || is(*s.codec, "av1venc"))
         c.flags |= AV_CODEC_FLAG_GLOBAL_HEADER;
-    c.thread_count = s.threads;
+    // A number means pictures at a time to H.265, 16 at most; its pool has the threads, see configurePass.
+    c.thread_count = is(*s.codec, "h265venc") ? 0 : s.threads;
     c.strict_std_compliance = FF_COMPLIANCE_UNOFFICIAL;
     return setOptions(c, s.codec->options);
 }
@@ -279,6 +280,8 @@ std::string VideoEnc::configurePass() {
     AVCodecContext& c = *context_;
     const bool x265 = is(*s.codec, "h265venc");
     std::string own = x265 ? "log-level=none:open-gop=0" : "";
+    // Its own pool has a thread a core otherwise.
+    if (x265 && s.threads > 0) own += ":pools=" + std::to_string(s.threads);
     if (s.passes && s.codec->has(VideoTrait::statsText | VideoTrait::statsFile)) {
         c.flags |= s.firstPass ? AV_CODEC_FLAG_PASS1 : AV_CODEC_FLAG_PASS2;
         if (s.codec->has(VideoTrait::statsFile)) {

@@ -42,6 +42,7 @@ TEST_F(FilmJobs, areWhatTheirOptionsSay) {
          "size=96x64",
          {"--vcodec", "h265venc:avOptions=x265-params=aq-mode=1", "--bitrate", "300k", "--two-pass"},
          "codec_name=hevc"},
+        {"g.mkv", "size=1280x720", {"--vcodec", "h265venc:preset=ultrafast,threads=40"}, "codec_name=hevc"},
         {"e.mxf", "size=1920x1080", {"--vcodec", "vc3venc", "--rate", "25i"}, "field_order=tt"},
         {"f.mp4",
          "size=96x64",
