@@ -92,9 +92,6 @@ void PresetPlanner::takeEncoder(PlannedStream& stream) {
         options_.fit(stream.type, stream.part.input, stream.part.stream, encoder);
     stream.set = options_.encoders.text(stream.type);
     setEncoder(encoder, stream.type, options_.encoders, plan_.output.name);
-    if (const std::string& pixel = options_.effects.pixel;
-        stream.isVideo() && !pixel.empty() && !isRawEncoder(encoder))
-        setChecked(encoder, "type", static_cast<int>(parsePixel(pixel, "--pixel")), "--pixel");
 }
 
 PictureFormat PresetPlanner::wanted(const PlannedStream& stream, const QvCodec& encoder, bool& asks) const {
