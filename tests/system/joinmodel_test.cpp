@@ -130,6 +130,14 @@ void Model::addSoundTo(Number end, const Segment& segment, Number first, Number 
         samples.push_back(from == kNothing || (plain && n >= most) ? Unit{} : Unit{from, plain ? n : kAny});
 }
 
+std::string sizeOf(const Input& input) {
+    const std::string side = std::to_string(input.side);
+    return side + "x" + side;
+}
+std::string rateOf(const Input& input) {
+    return std::to_string(input.rate.num) + "/" + std::to_string(input.rate.den);
+}
+
 class JoinModel : public Tool, public testing::WithParamInterface<bool> {
   protected:
     void SetUp() override {
@@ -158,14 +166,12 @@ class JoinModel : public Tool, public testing::WithParamInterface<bool> {
         if (!std::filesystem::exists("/usr/bin/ffmpeg")) GTEST_SKIP() << "there is no ffmpeg here";
         const Words h264{"-c:v", "libx264", "-qp", "0", "-bf", "3", "-g", "12"};
         for (int input = 0; input < 3; ++input) {
-            const std::string side = std::to_string(kInputs[input].side);
-            const Fraction& rate = kInputs[input].rate;
             if (input > 0)
                 works({"transcode", kInputs[input].name, "-o", kRaw[input], "--no-audio", "--pixel", "I420"});
             Words made{"-f",       "rawvideo",
                        "-pix_fmt", "yuv420p",
-                       "-s",       side + "x" + side,
-                       "-r",       std::to_string(rate.num) + "/" + std::to_string(rate.den),
+                       "-s",       sizeOf(kInputs[input]),
+                       "-r",       rateOf(kInputs[input]),
                        "-i",       kRaw[input]};
             if (input == 1) made = made + Words{"-i", "tone.wav", "-c:a", "pcm_s16le"};
             film(made + (input == 2 ? Words{"-c:v", "ffv1"} : h264), input);
@@ -186,12 +192,9 @@ class JoinModel : public Tool, public testing::WithParamInterface<bool> {
     static Words rawOf(const Words& words) {
         for (const std::string& word : words)
             for (int input = 0; input < 3; ++input)
-                if (word.starts_with(kRaw[input])) {
-                    const std::string side = std::to_string(kInputs[input].side);
-                    const Fraction& rate = kInputs[input].rate;
-                    return {"--raw", "size=" + side + "x" + side + ",pixel=I420,rate=" +
-                                         std::to_string(rate.num) + "/" + std::to_string(rate.den)};
-                }
+                if (word.starts_with(kRaw[input]))
+                    return {"--raw",
+                            "size=" + sizeOf(kInputs[input]) + ",pixel=I420,rate=" + rateOf(kInputs[input])};
         return {};
     }
 

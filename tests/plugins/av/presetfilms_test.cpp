@@ -17,9 +17,10 @@ class PresetFilms : public FilmsInTheTool {
         return tarsel(words);
     }
     std::string probed(const std::string& name) const {
-        return runProgram({"/usr/bin/env", "ffprobe", "-v", "error", "-of", "csv=p=0", "-show_entries",
-                           "stream=codec_name,width,height,sample_aspect_ratio,field_order,r_frame_rate,"
-                           "sample_rate,channels",
+        const std::string asked =
+            "stream=codec_name,width,height,sample_aspect_ratio,field_order,r_frame_rate,sample_rate,"
+            "channels";
+        return runProgram({"/usr/bin/env", "ffprobe", "-v", "error", "-of", "csv=p=0", "-show_entries", asked,
                            folder.file(name)})
             .out;
     }

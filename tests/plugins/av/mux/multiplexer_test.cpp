@@ -244,8 +244,8 @@ class FilmWithSound : public Multiplexers {
     }
     // What the engine's decoder reads.
     std::string heard(const std::string& film) const {
-        const Outcome read =
-            runProgram({QV_BINARY_DIR "/bin/tarsel", "transcode", film, "-y", "-o", folder.file("x.wav")});
+        const std::string tool = QV_BINARY_DIR "/bin/tarsel";
+        const Outcome read = runProgram({tool, "transcode", film, "-y", "-o", folder.file("x.wav")});
         EXPECT_EQ(read.status, 0) << read.err;
         return TempFolder::read(folder.file("x.wav")).substr(44);
     }
