@@ -358,7 +358,7 @@ TEST_F(Joined, TheCommandAfterwardsGetsTheFilesOfAllSegments) {
     };
     const std::string a = quoted(a_), b = quoted(b_), sound = quoted(aSound_);
     std::string enabled = "cat";
-    for (const std::string& name : {sound, a, sound}) enabled += " " + name;
+    for (const std::string& name : {sound, a, sound}) enabled.append(" ").append(name);
     for (const bool all : {true, false}) {
         const auto open = restore(all ? 0 : QvBatchTask::skipDisabled);
         ASSERT_TRUE(open->task) << open->error;
