@@ -359,10 +359,12 @@ TEST_F(Joined, TheCommandAfterwardsGetsTheFilesOfAllSegments) {
     const std::string a = quoted(a_), b = quoted(b_), sound = quoted(aSound_);
     std::string enabled = "cat";
     for (const std::string& name : {sound, a, sound}) enabled.append(" ").append(name);
+    std::string everything = enabled;
+    everything.append(" ").append(b);
     for (const bool all : {true, false}) {
         const auto open = restore(all ? 0 : QvBatchTask::skipDisabled);
         ASSERT_TRUE(open->task) << open->error;
-        EXPECT_EQ(open->task->currentPostprocessCommand().asString(), all ? enabled + " " + b : enabled);
+        EXPECT_EQ(open->task->currentPostprocessCommand().asString(), all ? everything : enabled);
     }
     state_.swapSegments(0, 1);
     state_.removeSegment(2);
