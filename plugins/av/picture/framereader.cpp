@@ -22,6 +22,7 @@ constexpr std::size_t notShown = static_cast<std::size_t>(-1);
 // A jump of the clock that is longer than this is no picture that stays, in streams that are cut together.
 constexpr int longestStepOfBroadcast = 10;  // seconds
 constexpr int longestStepOfFile = 30 * 60 * 60;
+constexpr int mostStarts = 8;  // that may give nothing on the way to one picture
 
 // Whether pictures that are not referred to are presented as soon as they are decoded, so that the order of
 // presentation follows from the times of decoding.
@@ -83,6 +84,8 @@ class FrameReader::Decoding {
     bool findFirst(std::string& reason);
     std::size_t startFor(std::size_t wanted) const;
     bool reach(std::size_t wanted, std::string& failure);
+    void dropStart(int& dropped);
+    Read advance(std::size_t wanted, int& dropped, std::string& failure);
     Read pull(std::string& failure);
     void conceal(std::size_t number);
     bool hasTimes() const;
@@ -253,8 +256,15 @@ bool FrameReader::Decoding::reach(std::size_t wanted, std::string& failure) {
     return false;
 }
 
-FrameReader::Read FrameReader::Decoding::show(std::size_t wanted, std::string& failure) {
-    if (heldNumber_ == wanted) return Read::picture;
+// The picture can't be reached from startedAt_. Each start that gives nothing may cost a decoding to the end
+// of the film, so after some of them the only one left before the picture is the first packet.
+void FrameReader::Decoding::dropStart(int& dropped) {
+    noStart_[startedAt_] = true;
+    if (++dropped == mostStarts) std::fill_n(noStart_.begin(), static_cast<std::ptrdiff_t>(startedAt_), true);
+}
+
+// Decodes up to the wanted picture; the end if it does not come.
+FrameReader::Read FrameReader::Decoding::advance(std::size_t wanted, int& dropped, std::string& failure) {
     if (!reach(wanted, failure)) return Read::failed;
     for (;;) {
         if (!comingNumber_ && !ended_ && pull(failure) == Read::failed) return Read::failed;
@@ -262,23 +272,28 @@ FrameReader::Read FrameReader::Decoding::show(std::size_t wanted, std::string& f
             // Some containers flag as keys what needs pictures before it.
             const bool started = comingNumber_ == number_[startedAt_] && coming_->key_frame;
             if (!started) {
-                noStart_[startedAt_] = true;
+                dropStart(dropped);
                 comingNumber_.reset();
                 if (!reach(wanted, failure)) return Read::failed;
                 continue;
             }
         }
-        if (!comingNumber_ || *comingNumber_ > wanted) break;
+        if (!comingNumber_ || *comingNumber_ > wanted) return Read::end;
         std::swap(held_, coming_);
         heldNumber_ = std::exchange(comingNumber_, std::nullopt);
         if (*heldNumber_ == wanted) return Read::picture;
     }
-    conceal(wanted);
-    if (heldNumber_) return Read::picture;
-    // Nothing before it came from that start: what the film shows then is further ahead of it.
-    if (startedAt_ > 0) {
-        noStart_[startedAt_] = true;
-        return show(wanted, failure);
+}
+
+FrameReader::Read FrameReader::Decoding::show(std::size_t wanted, std::string& failure) {
+    if (heldNumber_ == wanted) return Read::picture;
+    for (int dropped = 0;;) {
+        if (const Read result = advance(wanted, dropped, failure); result != Read::end) return result;
+        conceal(wanted);
+        if (heldNumber_) return Read::picture;
+        if (startedAt_ == 0) break;
+        // Nothing before it came from that start: what the film shows then is further ahead of it.
+        dropStart(dropped);
     }
     failure = "its pictures can't be decoded";
     return Read::failed;

@@ -186,4 +186,36 @@ TEST_F(FrameReaderOfFilms, aHoleInTheFileIsCountedAndTheRestIsExact) {
     EXPECT_EQ(damaged->concealed(), 1);
 }
 
+// Each picture says that decoding can start with it, and none but the first two can be decoded.
+TEST_F(FrameReaderOfFilms, startsThatGiveNothingEndAtTheFirstPicture) {
+    const std::string file = film("keys.mp4", {"-c:v", "libx264", "-g", "1", "-bf", "0"});
+    const auto whole = open(file);
+    ASSERT_TRUE(whole);
+    ASSERT_TRUE(whole->seek(1));
+    ASSERT_EQ(whole->read(), FrameReader::Read::picture);
+    std::string bytes = TempFolder::read(file);
+    std::string reason;
+    const auto input = av::MediaInput::open(*bytes_, "", reason);
+    ASSERT_TRUE(input) << reason;
+    const auto index = av::PacketIndex::build(*input, reason);
+    ASSERT_TRUE(index) << reason;
+    const auto& packets = index->packets(0);
+    for (std::size_t i = 2; i < packets.size(); ++i) {
+        // The length of the first unit stays, and nothing of what it holds.
+        const auto at = static_cast<std::size_t>(packets[i].position) + 5;
+        const std::size_t size = std::size_t{packets[i].bytes} - 5;
+        bytes.replace(at, size, size, '\xff');
+    }
+    folder.write("damaged.mp4", bytes);
+    const auto damaged = open(folder.file("damaged.mp4"));
+    ASSERT_TRUE(damaged);
+    ASSERT_EQ(damaged->format().frames, 50);
+    for (const int n : {40, 10, 49}) {
+        ASSERT_TRUE(damaged->seek(n));
+        ASSERT_EQ(damaged->read(), FrameReader::Read::picture) << n;
+        EXPECT_TRUE(bytesOf(damaged->frame(), 0) == bytesOf(whole->frame(), 0)) << n;
+    }
+    EXPECT_EQ(damaged->concealed(), 3);
+}
+
 }  // namespace
