@@ -2,7 +2,8 @@
 //
 //     night.xml              the list
 //     night.xml.lock         locked while a run of the tool changes the list
-//     night.xml.journal.d/   what was done: a file for each task, and the lock of the run
+//     night.xml.journal.d/   what was done: a file for each task, the lock of the run, and for batches on a
+//                            cluster "queue" and what the elements of each array print
 #pragma once
 
 #include <functional>
@@ -21,6 +22,9 @@ class BatchFile {
     const std::string& name() const { return name_; }    // absolute
     std::string folder() const;                          // that relative names in the list count from
     std::string runLock() const { return journalFolder() + "run"; }
+    std::string queue() const { return journalFolder() + "queue"; }  // what a scheduler was given
+    // To which the elements of an array of this name print.
+    std::string elementOutput(const std::string& array) const { return journalFolder() + array + ".txt"; }
     std::string journal(const std::string& id) const { return journalFolder() + id; }
 
     // Throws Failure (input) for a file that can't be read or is no list.

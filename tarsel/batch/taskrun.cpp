@@ -108,6 +108,7 @@ void TaskRun::run(const BatchFile& file, const BatchTask& task, Signals& signals
     OutputPolicy policy = job.policy;
     policy.placing = [&](const std::vector<PlacedFile>& files) { journal.placing(files); };
     try {
+        if (ready) ready();
         carryOut(file, task, policy, signals);
     } catch (const Failure& failed) {
         // What -n keeps is not this task's work.

@@ -1,12 +1,16 @@
-// tarsel batch LIST run: all tasks that are left, or some of them in this process.
+// tarsel batch LIST run: all tasks that are left, or some of them in this process; submit and cancel: the
+// same by a scheduler.
 #include <algorithm>
 #include <climits>
 #include <optional>
 #include <thread>
 
+#include "tarsel/batch/journal.h"
 #include "tarsel/batch/report.h"
 #include "tarsel/batch/runner.h"
+#include "tarsel/batch/submitter.h"
 #include "tarsel/batch/taskrun.h"
+#include "tarsel/cluster/slurm.h"
 #include "tarsel/commands/batchcommands.h"
 #include "tarsel/commands/outputoptions.h"
 #include "tarsel/commands/progressoption.h"
@@ -28,13 +32,23 @@ constexpr int kMostRetries = 100;
 struct Given {
     OutputOptions outputs;
     ProgressOption progress;
-    std::string jobs, retries, timeout, threads, handed, report;
-    Words tasks;
-    bool stopOnError = false, verify = false, quiet = false;
+    std::string jobs, retries, timeout, threads, handed, report, arraySize;
+    Words tasks, schedulerOptions;
+    bool stopOnError = false, verify = false, quiet = false, inOrder = false, slurm = false;
     bool allowPost = false, acceptPartial = false, strict = false;
 };
 
 // --- Some tasks in this process.
+
+// Throws Failure unless all that makes its inputs is done.
+void requireInputsMade(const BatchFile& file, const std::vector<BatchTask>& tasks, size_t task,
+                       const std::vector<Before>& earlier, bool verify) {
+    for (const Before& before : earlier) {
+        const BatchTask& other = tasks[before.task];
+        if (before.gives && !TaskRecord::read(file.journal(other.id)).isDone(keyOf(other), verify))
+            throw failure(Msg::batchInputFailed, {tasks[task].output, std::to_string(other.number)});
+    }
+}
 
 void runTasks(const Given& given, const BatchFile& file, Signals& signals) {
     TaskRun how;
@@ -55,8 +69,11 @@ void runTasks(const Given& given, const BatchFile& file, Signals& signals) {
     const std::vector<BatchTask> tasks = file.tasksOf(list);
     std::vector<size_t> wanted;
     for (const std::string& word : given.tasks) wanted.push_back(findTask(tasks, word, file));
+    std::vector<std::vector<Before>> order;
+    if (given.inOrder) order = orderOf(tasks);
     for (const size_t i : wanted) {
         const int index = static_cast<int>(i);
+        if (given.inOrder) how.ready = [&] { requireInputsMade(file, tasks, i, order[i], given.verify); };
         how.run(file, batchTask(list.at(index), index + 1, file.folder()), signals);
     }
 }
@@ -74,8 +91,8 @@ int numberOf(const std::string& text, int otherwise, int low, int high, const ch
     return text.empty() ? otherwise : static_cast<int>(parseNumber(text, low, high, option));
 }
 
-Words commandOf(const Given& given, const BatchFile& file, int jobs) {
-    Words words = {"batch", file.name(), "run", "--progress", "json"};
+// What is passed on to the processes of tasks.
+void addFlags(Words& words, const Given& given) {
     const struct {
         bool on;
         const char* option;
@@ -86,6 +103,11 @@ Words commandOf(const Given& given, const BatchFile& file, int jobs) {
     for (const auto& flag : flags)
         if (flag.on) words.emplace_back(flag.option);
     if (!given.outputs.stale.empty()) words.insert(words.end(), {"--stale", given.outputs.stale});
+}
+
+Words commandOf(const Given& given, const BatchFile& file, int jobs) {
+    Words words = {"batch", file.name(), "run", "--progress", "json"};
+    addFlags(words, given);
     const int cores = static_cast<int>(std::thread::hardware_concurrency());
     const int threads = std::max(cores / jobs, 1);
     if (!given.threads.empty())
@@ -132,6 +154,46 @@ void runAll(const Given& given, const BatchFile& file, const std::string& log, S
                               formatTime(result.seconds).substr(0, 7));
 }
 
+// --- What a scheduler runs.
+
+void submit(const Given& given, const BatchFile& file, const Scheduler& scheduler, const std::string& log) {
+    SubmitOptions options;
+    options.arraySize = static_cast<size_t>(numberOf(given.arraySize, SlurmScheduler::kMostElements, 1,
+                                                     SlurmScheduler::kMostElements, "--array-size"));
+    options.atOnce = numberOf(given.jobs, 0, 1, INT_MAX, "--jobs");
+    options.verify = given.verify;
+    given.outputs.policy();  // refuses what contradicts itself
+    if (!log.empty() && log != "stderr") options.log = absoluteName(log);
+    options.command = ChildProcess::passed();
+    for (const std::string& word : Words{"batch", file.name(), "run", "--quiet", "--in-order"})
+        options.command.push_back(word);
+    addFlags(options.command, given);
+    options.options = given.schedulerOptions;
+    Submitter submitter(file, scheduler, options);
+    submitter.submit();
+    const size_t count = submitter.submitted();
+    const Words& jobs = submitter.jobs();
+    std::string line = std::to_string(count) + (count == 1 ? " task" : " tasks") + " submitted";
+    if (!jobs.empty()) line += (jobs.size() == 1 ? " as job " : " as jobs ") + joined(jobs);
+    tell(Level::note, line + "; " + std::to_string(submitter.doneBefore()) + " done before, " +
+                          std::to_string(submitter.living()) + " queued or running");
+}
+
+void cancel(const BatchFile& file) {
+    const Words jobs = cancelSubmitted(file, SlurmScheduler());
+    if (jobs.empty()) return tell(Level::note, lineOf(Msg::schedulerNothing, {file.shown()}));
+    tell(Level::note, (jobs.size() == 1 ? "job " : "jobs ") + joined(jobs) + " cancelled");
+}
+
+// Options that mean the same in run and in submit.
+void addShared(Command& command, Given& given) {
+    command.flag("--verify", given.verify, "Know what was done by the bytes of the outputs as well");
+    command.flag("--allow-post", given.allowPost, "Run the commands that tasks have for afterwards");
+    command.flag("--accept-partial", given.acceptPartial, "Accept damaged inputs and take what can be read");
+    command.flag("--strict", given.strict, "Let a task fail if there is a warning");
+    given.outputs.add(command);
+}
+
 }  // namespace
 
 void addBatchRun(Command& batch, Signals& signals, const ListName& list, const std::string& version,
@@ -142,21 +204,21 @@ void addBatchRun(Command& batch, Signals& signals, const ListName& list, const s
     command.option("--retry", given->retries, "Try a task that failed so often again (0)", "N");
     command.option("--timeout", given->timeout, "Stop a task that takes longer: SS, MM:SS, HH:MM:SS", "TIME");
     command.flag("--stop-on-error", given->stopOnError, "Begin no task after one has failed");
-    command.flag("--verify", given->verify, "Know what was done by the bytes of the outputs as well");
     command.list("--task", given->tasks, "Run only this task, in this process", "TASK");
+    command.flag("--in-order", given->inOrder,
+                 "With --task: it fails if a task that makes its input is not done");
     command.option("--handed", given->handed, "Of the processes of a run: the task is in descriptor 3", "N");
     command.option("--report", given->report, "Write what became of each task as a page or as JSON",
                    "FILE.html|.json");
     given->progress.add(command);
-    command.flag("--allow-post", given->allowPost, "Run the commands that tasks have for afterwards");
-    command.flag("--accept-partial", given->acceptPartial, "Accept damaged inputs and take what can be read");
-    command.flag("--strict", given->strict, "Let a task fail if there is a warning");
     addThreads(command, given->threads);
-    given->outputs.add(command);
+    addShared(command, *given);
     command.flag("-q,--quiet", given->quiet, "Print nothing but errors");
     command.action(
         [&signals, &log, list, given] {
             const BatchFile file(*list);
+            if (given->inOrder && given->tasks.empty())
+                throw failure(Msg::argumentMissing, {"--task", "tarsel batch LIST run --help"});
             if (given->tasks.empty() && given->handed.empty()) return runAll(*given, file, log, signals);
             for (const auto& [value, name] : {std::pair{&given->jobs, "--jobs"},
                                               {&given->retries, "--retry"},
@@ -166,4 +228,23 @@ void addBatchRun(Command& batch, Signals& signals, const ListName& list, const s
             runTasks(*given, file, signals);
         },
         [list, given, version] { given->progress.open("", {*list}, given->outputs.overwrite, version); });
+}
+
+void addBatchCluster(Command& batch, const ListName& list, const std::string& log) {
+    Command command = batch.command("submit", "Let a scheduler run the tasks that are not done");
+    const auto given = std::make_shared<Given>();
+    command.flag("--slurm", given->slurm, "By Slurm, as arrays of jobs");
+    command.option("--jobs", given->jobs, "So many tasks of an array at a time (all)", "N");
+    command.option("--array-size", given->arraySize, "The most tasks of an array (1000)", "N");
+    addShared(command, *given);
+    command.arguments("OPTION", given->schedulerOptions,
+                      "After --: options for the scheduler, as --partition=NAME", 0, Need::optional);
+    command.action([&log, list, given] {
+        const BatchFile file(*list);
+        if (!given->slurm) throw failure(Msg::schedulerUnknown, {file.shown()});
+        submit(*given, file, SlurmScheduler(), log);
+    });
+    batch.command("cancel", "Take back what a scheduler has of the list").action([list] {
+        cancel(BatchFile(*list));
+    });
 }

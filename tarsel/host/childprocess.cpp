@@ -67,6 +67,7 @@ std::vector<std::string>& passedOn() {
 }  // namespace
 
 void ChildProcess::passOn(std::vector<std::string> arguments) { passedOn() = std::move(arguments); }
+const std::vector<std::string>& ChildProcess::passed() { return passedOn(); }
 
 ChildProcess::ChildProcess(const std::vector<std::string>& arguments, Stream captured, int handed) {
     std::vector<char*> words = {const_cast<char*>("tarsel")};

@@ -21,6 +21,7 @@ class ChildProcess {
 
     // What all of them get in front of their arguments. Once, before the first.
     static void passOn(std::vector<std::string> arguments);
+    static const std::vector<std::string>& passed();
     // `arguments`: those of the tool. `handed`: an open descriptor that becomes its descriptor kHanded, or
     // -1. Throws Failure if there is no room for another process.
     ChildProcess(const std::vector<std::string>& arguments, Stream captured, int handed = -1);

@@ -358,6 +358,8 @@ enum class Msg : unsigned short {
     pluginEndedAll,
     // batches
     childNotStarted,
+    programMissing,
+    programSilent,
     batchRuns,
     batchUnreadable,
     batchExists,
@@ -386,6 +388,14 @@ enum class Msg : unsigned short {
     batchStopped,
     batchNotNoted,
     batchEmpty,
+    // batches on a cluster
+    schedulerRefuses,
+    schedulerWord,
+    schedulerOwnOption,
+    schedulerPartly,
+    schedulerUnknown,
+    schedulerSilent,
+    schedulerNothing,
     // watched folders
     watchNoFolder,
     watchFolderMissing,
