@@ -9,13 +9,17 @@ std::vector<TaskArray> arraysOf(const std::vector<TaskPlace>& places,
     std::vector<std::vector<size_t>> byLevel;
     for (size_t i = 0; i < count; ++i) {
         if (!places[i].due) continue;
-        for (const Before& before : order[i])
-            if (places[before.task].due) levels[i] = std::max(levels[i], levels[before.task] + 1);
+        // Those that wait for what is queued already hold up no others either.
+        for (const Before& before : order[i]) {
+            const TaskPlace& earlier = places[before.task];
+            if (earlier.due) levels[i] = std::max(levels[i], levels[before.task] + 1);
+            if (!earlier.job.empty()) levels[i] = std::max(levels[i], size_t{1});
+        }
         if (byLevel.size() <= levels[i]) byLevel.resize(levels[i] + 1);
         byLevel[levels[i]].push_back(i);
     }
     std::vector<TaskArray> arrays;
-    for (const std::vector<size_t>& level : byLevel)
+    for (const std::vector<size_t>& level : byLevel)  // the first may be empty
         for (size_t k = 0; k < level.size(); ++k) {
             if (k % most == 0) arrays.emplace_back();
             const size_t task = level[k];
