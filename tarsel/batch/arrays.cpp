@@ -42,10 +42,11 @@ std::string shellWord(const std::string& text) {
 std::string ElementScript::text() const {
     const std::string most = std::to_string(mostCores);
     std::string script = "#!/bin/sh\nset --";
-    for (const std::string& name : tasks) script += " " + shellWord(name);
+    for (size_t i = 0; i < tasks.size(); ++i) script += " " + tasks[i] + "@" + places[i];
     script += "\nshift " + index + "\ncores=" + cores;
     script += "\n[ \"$cores\" -le " + most + " ] || cores=" + most + "\nexec " + shellWord(words.at(0));
-    if (!log.empty()) script += " --log " + shellWord(log + ".") + "\"$1\"";
+    if (!log.empty()) script += " --log " + shellWord(log + ".") + "\"${1%@*}\"";
     for (size_t i = 1; i < words.size(); ++i) script += " " + shellWord(words[i]);
-    return script + " --threads \"$cores\" --task \"$1\"\n";
+    return script + " --threads \"$cores\" --task \"${1%@*}\" --snapshot " + shellWord(snapshot + "@") +
+           "\"${1#*@}\"\n";
 }

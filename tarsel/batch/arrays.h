@@ -26,10 +26,13 @@ std::vector<TaskArray> arraysOf(const std::vector<TaskPlace>& places,
 
 // What an element of an array does, as a script of the shell.
 struct ElementScript {
-    std::vector<std::string> tasks;  // names; element k runs the k-th
-    std::vector<std::string> words;  // the tool and its arguments, to which --threads and --task are added
-    std::string log;                 // absolute; the task's name is added to it; "" for none
-    std::string index, cores;        // of the element, as the shell has them; see Scheduler
+    std::vector<std::string> tasks;   // names; element k runs the k-th
+    std::vector<std::string> places;  // of the tasks in the snapshot; see Snapshot::add
+    std::string snapshot;             // absolute name of the file
+    // The tool and its arguments, to which those are added that the element or the task decides.
+    std::vector<std::string> words;
+    std::string log;           // absolute; the task's name is added to it; "" for none
+    std::string index, cores;  // of the element, as the shell has them; see Scheduler
     int mostCores = 1;
 
     // No character in a word acts in the shell, whatever it is.

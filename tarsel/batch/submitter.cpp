@@ -3,6 +3,7 @@
 #include <qvplugcore/qvplugcore.h>
 
 #include "tarsel/batch/journal.h"
+#include "tarsel/batch/snapshot.h"
 #include "tarsel/host/clock.h"
 #include "tarsel/host/command.h"
 #include "tarsel/host/files.h"
@@ -21,14 +22,16 @@ Submitter::Submitter(const BatchFile& file, const Scheduler& scheduler, const Su
 
 void Submitter::submit() {
     scheduler_.checkOptions(options_.options);
-    tasks_ = file_.tasks();
+    list_ = file_.load();
+    tasks_ = file_.tasksOf(list_);
     if (tasks_.empty()) throw failure(Msg::batchEmpty, {file_.shown()});
     // Neither another submission nor a run of the list changes meanwhile what is left to do.
     const NamedLock lock(file_.runLock(), file_.shown());
     submissions_ = Submissions(file_.queue());
     queue_ = ClusterQueue(submissions_, scheduler_.elements(submissions_.names()));
     forgetEnded();
-    for (const TaskArray& array : arraysOf(places(), orderOf(tasks_), options_.arraySize)) {
+    order_ = orderOf(tasks_);
+    for (const TaskArray& array : arraysOf(places(), order_, options_.arraySize)) {
         try {
             jobs_.push_back(submitArray(array));
         } catch (const Failure& failed) {
@@ -45,8 +48,13 @@ void Submitter::forgetEnded() {
     const std::vector<std::string> living = queue_.livingArrays();
     const std::set<std::string> kept(living.begin(), living.end());
     for (const std::string& name : submissions_.names())
-        if (!kept.count(name)) removeFile(file_.elementOutput(name));
+        if (!kept.count(name)) removeFiles(name);
     submissions_.keep(living);
+}
+
+void Submitter::removeFiles(const std::string& array) const {
+    removeFile(file_.elementOutput(array));
+    removeFile(file_.elementTasks(array));
 }
 
 std::vector<TaskPlace> Submitter::places() {
@@ -78,16 +86,24 @@ std::string Submitter::newName() {
 }
 
 std::string Submitter::submitArray(const TaskArray& array) {
+    ClusterArray wanted;
+    wanted.name = newName();
     ElementScript script;
-    for (const size_t task : array.tasks) script.tasks.push_back(tasks_[task].id);
+    Snapshot snapshot;
+    for (const size_t task : array.tasks) {
+        std::vector<size_t> makers;
+        for (const Before& before : order_[task])
+            if (before.gives) makers.push_back(before.task);
+        script.tasks.push_back(tasks_[task].id);
+        script.places.push_back(snapshot.add(list_, task, makers));
+    }
+    script.snapshot = file_.elementTasks(wanted.name);
     script.words = {ownProgram()};
     script.words.insert(script.words.end(), options_.command.begin(), options_.command.end());
     script.log = options_.log;
     script.index = scheduler_.indexWord();
     script.cores = scheduler_.coresWord();
     script.mostCores = kQvMostThreads;
-    ClusterArray wanted;
-    wanted.name = newName();
     wanted.script = script.text();
     wanted.size = array.tasks.size();
     wanted.atOnce = options_.atOnce;
@@ -98,10 +114,14 @@ std::string Submitter::submitArray(const TaskArray& array) {
     const std::vector<std::string> before = submissions_.names();
     submissions_.add({wanted.name, secondsSince1970(), script.tasks});
     try {
+        snapshot.write(script.snapshot);
         return scheduler_.submit(wanted);
     } catch (const Failure&) {
         // One that did not answer in time may have taken it.
-        if (isUnknown(wanted.name)) submissions_.keep(before);
+        if (isUnknown(wanted.name)) {
+            submissions_.keep(before);
+            removeFiles(wanted.name);
+        }
         throw;
     }
 }

@@ -33,6 +33,7 @@ class Submitter {
 
   private:
     void forgetEnded();
+    void removeFiles(const std::string& array) const;
     std::vector<TaskPlace> places();
     std::string newName();
     std::string submitArray(const TaskArray& array);
@@ -43,7 +44,9 @@ class Submitter {
     const SubmitOptions& options_;
     Submissions submissions_;
     ClusterQueue queue_;
+    QvBatchList list_;
     std::vector<BatchTask> tasks_;
+    std::vector<std::vector<Before>> order_;
     std::vector<std::string> jobs_;
     size_t due_ = 0, submitted_ = 0, done_ = 0, living_ = 0;
     int count_ = 0;

@@ -8,6 +8,7 @@
 #include "tarsel/batch/journal.h"
 #include "tarsel/batch/report.h"
 #include "tarsel/batch/runner.h"
+#include "tarsel/batch/snapshot.h"
 #include "tarsel/batch/submitter.h"
 #include "tarsel/batch/taskrun.h"
 #include "tarsel/cluster/slurm.h"
@@ -32,22 +33,29 @@ constexpr int kMostRetries = 100;
 struct Given {
     OutputOptions outputs;
     ProgressOption progress;
-    std::string jobs, retries, timeout, threads, handed, report, arraySize;
+    std::string jobs, retries, timeout, threads, handed, report, arraySize, snapshot;
     Words tasks, schedulerOptions;
-    bool stopOnError = false, verify = false, quiet = false, inOrder = false, slurm = false;
+    bool stopOnError = false, verify = false, quiet = false, slurm = false;
     bool allowPost = false, acceptPartial = false, strict = false;
 };
 
 // --- Some tasks in this process.
 
-// Throws Failure unless all that makes its inputs is done.
-void requireInputsMade(const BatchFile& file, const std::vector<BatchTask>& tasks, size_t task,
-                       const std::vector<Before>& earlier, bool verify) {
-    for (const Before& before : earlier) {
-        const BatchTask& other = tasks[before.task];
-        if (before.gives && !TaskRecord::read(file.journal(other.id)).isDone(keyOf(other), verify))
-            throw failure(Msg::batchInputFailed, {tasks[task].output, std::to_string(other.number)});
-    }
+// One that waited for others fails if one of them has not made its input.
+void runElement(const Given& given, TaskRun& how, const BatchFile& file, Signals& signals) {
+    const size_t mark = given.snapshot.rfind('@');
+    if (mark == std::string::npos || given.tasks.size() != 1)
+        throw failure(Msg::valueMissing, {"--snapshot", "one --task and FILE@PLACE"});
+    const SnapshotTasks found =
+        readSnapshot(file, given.snapshot.substr(0, mark), given.snapshot.substr(mark + 1));
+    if (found.task.id != given.tasks[0])
+        throw failure(Msg::batchUnreadable, {given.snapshot, "it holds another task"});
+    how.ready = [&] {
+        for (const BatchTask& maker : found.makers)
+            if (!TaskRecord::read(file.journal(maker.id)).isDone(keyOf(maker), given.verify))
+                throw failure(Msg::batchInputFailed, {found.task.output, std::to_string(maker.number)});
+    };
+    how.run(file, found.task, signals);
 }
 
 void runTasks(const Given& given, const BatchFile& file, Signals& signals) {
@@ -63,17 +71,15 @@ void runTasks(const Given& given, const BatchFile& file, Signals& signals) {
     how.plan = planWords;
     if (!given.handed.empty()) {
         const auto number = static_cast<int>(parseNumber(given.handed, 1, INT_MAX, "--handed"));
-        return how.run(file, file.handedTask(ChildProcess::kHanded, number), signals);
+        return how.run(file, file.handedTasks(ChildProcess::kHanded, {number}).front(), signals);
     }
+    if (!given.snapshot.empty()) return runElement(given, how, file, signals);
     QvBatchList list = file.load();
     const std::vector<BatchTask> tasks = file.tasksOf(list);
     std::vector<size_t> wanted;
     for (const std::string& word : given.tasks) wanted.push_back(findTask(tasks, word, file));
-    std::vector<std::vector<Before>> order;
-    if (given.inOrder) order = orderOf(tasks);
     for (const size_t i : wanted) {
         const int index = static_cast<int>(i);
-        if (given.inOrder) how.ready = [&] { requireInputsMade(file, tasks, i, order[i], given.verify); };
         how.run(file, batchTask(list.at(index), index + 1, file.folder()), signals);
     }
 }
@@ -165,7 +171,7 @@ void submit(const Given& given, const BatchFile& file, const Scheduler& schedule
     given.outputs.policy();  // refuses what contradicts itself
     if (!log.empty() && log != "stderr") options.log = absoluteName(log);
     options.command = ChildProcess::passed();
-    for (const std::string& word : Words{"batch", file.name(), "run", "--quiet", "--in-order"})
+    for (const std::string& word : Words{"batch", file.name(), "run", "--quiet"})
         options.command.push_back(word);
     addFlags(options.command, given);
     options.options = given.schedulerOptions;
@@ -205,8 +211,9 @@ void addBatchRun(Command& batch, Signals& signals, const ListName& list, const s
     command.option("--timeout", given->timeout, "Stop a task that takes longer: SS, MM:SS, HH:MM:SS", "TIME");
     command.flag("--stop-on-error", given->stopOnError, "Begin no task after one has failed");
     command.list("--task", given->tasks, "Run only this task, in this process", "TASK");
-    command.flag("--in-order", given->inOrder,
-                 "With --task: it fails if a task that makes its input is not done");
+    command.option("--snapshot", given->snapshot,
+                   "Of the elements of submit: where the task is, and those that make its inputs",
+                   "FILE@PLACE");
     command.option("--handed", given->handed, "Of the processes of a run: the task is in descriptor 3", "N");
     command.option("--report", given->report, "Write what became of each task as a page or as JSON",
                    "FILE.html|.json");
@@ -217,8 +224,6 @@ void addBatchRun(Command& batch, Signals& signals, const ListName& list, const s
     command.action(
         [&signals, &log, list, given] {
             const BatchFile file(*list);
-            if (given->inOrder && given->tasks.empty())
-                throw failure(Msg::argumentMissing, {"--task", "tarsel batch LIST run --help"});
             if (given->tasks.empty() && given->handed.empty()) return runAll(*given, file, log, signals);
             for (const auto& [value, name] : {std::pair{&given->jobs, "--jobs"},
                                               {&given->retries, "--retry"},

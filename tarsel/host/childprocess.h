@@ -67,7 +67,9 @@ class Bell {
 // Until one of them can be read, or so many milliseconds have passed; negative: without an end.
 void waitForAny(std::span<const int> descriptors, int milliseconds);
 
-// A file without a name that is gone when its last descriptor is closed. Throws Failure.
-Descriptor fileInMemory();
+// A file without a name that is gone when its last descriptor is closed, with this in it. Throws Failure.
+Descriptor fileInMemory(const std::string& text = "");
+// All that a file holds, from its first byte on.
+std::string contentsOf(const Descriptor& file);
 // By which it can be opened.
 std::string nameOfDescriptor(int descriptor);

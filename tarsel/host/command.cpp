@@ -18,8 +18,6 @@
 
 namespace {
 
-constexpr size_t kMostBytes = size_t{256} << 20;  // of an answer
-
 // Signals as a fresh process has them, whatever this one blocks or ignores.
 struct Fresh {
     Fresh() {
@@ -59,29 +57,6 @@ std::vector<char*> environmentWithout(const std::vector<std::string>& prefixes) 
             kept.push_back(*one);
     kept.push_back(nullptr);
     return kept;
-}
-
-void fill(const Descriptor& file, const std::string& text) {
-    for (size_t at = 0; at < text.size();) {
-        const ssize_t written =
-            pwrite(file.get(), text.data() + at, text.size() - at, static_cast<off_t>(at));
-        if (written < 0 && errno == EINTR) continue;
-        if (written <= 0) throw systemFailure(Msg::childNotStarted, "memory", errno);
-        at += static_cast<size_t>(written);
-    }
-}
-
-std::string contentsOf(const Descriptor& file) {
-    std::string text;
-    char block[65536];
-    for (ssize_t got; text.size() < kMostBytes; text.append(block, static_cast<size_t>(got))) {
-        got = pread(file.get(), block, sizeof block, static_cast<off_t>(text.size()));
-        if (got < 0 && errno == EINTR)
-            got = 0;
-        else if (got <= 0)
-            break;
-    }
-    return text;
 }
 
 // False if it took longer. It is waited for in either case.
@@ -133,8 +108,7 @@ void ShellCommand::kill() const { signal(SIGKILL); }
 
 Answer askProgram(const std::vector<std::string>& words, const std::string& input, double seconds,
                   const std::vector<std::string>& without) {
-    const Descriptor streams[] = {fileInMemory(), fileInMemory(), fileInMemory()};
-    fill(streams[0], input);
+    const Descriptor streams[] = {fileInMemory(input), fileInMemory(), fileInMemory()};
     Fresh fresh;
     for (int stream = 0; stream <= STDERR_FILENO; ++stream) fresh.give(streams[stream].get(), stream);
     std::vector<char*> arguments;
