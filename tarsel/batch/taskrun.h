@@ -30,6 +30,10 @@ struct TaskRun {
 // Throws Failure (input) for a task that can't be run as it is stored.
 void requireSound(const BatchTask& task, const std::string& shown);
 
+// Throws Failure (input) if a font family that the task draws with is not installed here. Another one would
+// take its place, and the pictures would be other ones than on the next machine.
+void requireFonts(const AnyDict& state, const std::string& shown);
+
 // "night.xml (task 3)".
 std::string shownTask(const BatchFile& file, const BatchTask& task);
 

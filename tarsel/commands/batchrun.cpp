@@ -51,6 +51,7 @@ void runElement(const Given& given, TaskRun& how, const BatchFile& file, Signals
     if (found.task.id != given.tasks[0])
         throw failure(Msg::batchUnreadable, {given.snapshot, "it holds another task"});
     how.ready = [&] {
+        requireFonts(found.task.state, shownTask(file, found.task));
         for (const BatchTask& maker : found.makers)
             if (!TaskRecord::read(file.journal(maker.id)).isDone(keyOf(maker), given.verify))
                 throw failure(Msg::batchInputFailed, {found.task.output, std::to_string(maker.number)});

@@ -368,6 +368,7 @@ constexpr Message kMessages[] = {
     {Msg::batchIdShort,        Exit::usage,  "{file} has no task {name}",             "a name of a task has at least 8 digits",                    "'tarsel batch LIST list' shows all"},
     {Msg::batchIdOpen,         Exit::usage,  "{name} is not one task",                "several tasks of {file} begin so",                          "give more digits"},
     {Msg::batchTaskDamaged,    Exit::input,  "{file} is damaged",                     "{system}",                                                  "remove the task and add it again"},
+    {Msg::batchTaskLacks,      Exit::module, "can't run {file}",                      "{system}",                                                  "install it here, or run the task where it is"},
     {Msg::batchOutputTwice,    Exit::usage,  "can't add {file}",                      "task {text} writes it",                                     "give another name, or remove that task"},
     {Msg::batchOutputStream,   Exit::usage,  "can't add {file}",                      "the standard output is none of a batch",                    "give -o the name of a file"},
     {Msg::batchNoFiles,        Exit::input,  "--files {name}",                        "there is no such file",                                     "check the pattern; in quotes, so that the shell leaves it as it is"},

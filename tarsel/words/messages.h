@@ -368,6 +368,7 @@ enum class Msg : unsigned short {
     batchIdShort,
     batchIdOpen,
     batchTaskDamaged,
+    batchTaskLacks,
     batchOutputTwice,
     batchOutputStream,
     batchNoFiles,

@@ -155,14 +155,31 @@ TEST_F(FakeSlurm, ANodeThatLacksSomethingSaysWhat) {
     makeWav("gone.wav", 400);
     works({"batch", "l.xml", "add", "gone.wav", "-o", "1.wav"});
     works({"batch", "l.xml", "add", "1.wav", "-o", "2.wav", "--preset", "WAV"});
-    submit();
+    fs::create_directory(folder.path() / "plugins");
+    fs::copy_file(QV_BINARY_DIR "/plugins/pcm8_plugin.so", folder.file("plugins/pcm8_plugin.so"));
+    folder.write("tone.pcm8", patternBytes(5000));
+    works({"--plugins", "plugins", "batch", "l.xml", "add", "tone.pcm8", "-o", "3.wav"});
+    const std::string family = runProgram({"fc-match", "--format=%{family[0]}", "sans"}).out;
+    folder.write("s.srt", "1\n00:00:00,000 --> 00:00:01,000\nHello\n");
+    works({"batch", "l.xml", "add", "testgen:size=64x64,rate=25,duration=0.2", "--no-audio", "-o", "4.yuv",
+           "--subtitles", "s.srt", "--subtitle-style", "font=" + family});
+    EXPECT_EQ(tarsel({"--plugins", "plugins", "batch", "l.xml", "submit", "--slurm"}, surroundings()).status,
+              0);
     fs::remove(folder.file("gone.wav"));
+    fs::remove(folder.file("plugins/pcm8_plugin.so"));
+    folder.write("fonts.conf", "<?xml version='1.0'?><fontconfig><dir>/none</dir></fontconfig>");
+    environment.push_back("FONTCONFIG_FILE=" + folder.file("fonts.conf"));
+    EXPECT_EQ(element(1, 1).status, 5);
+    EXPECT_EQ(element(1, 2).status, 5);
+    setQueue("");
+    EXPECT_THAT(states()[2]["error"], HasSubstr("'pcm8dec'"));
+    EXPECT_THAT(states()[3]["error"], HasSubstr("there is no font '" + family + "' here"));
+    environment.resize(2);
     EXPECT_EQ(element(1, 0).status, 3);
     EXPECT_EQ(element(2, 0).status, 1);
-    setQueue("");
     EXPECT_THAT(states()[0]["error"], HasSubstr("gone.wav"));
     EXPECT_THAT(states()[1]["error"], HasSubstr("task 1"));
-    EXPECT_THAT(submit().err, HasSubstr("2 tasks submitted"));
+    EXPECT_THAT(submit().err, HasSubstr("4 tasks submitted"));
 }
 
 TEST_F(FakeSlurm, OneThatRefusesOrIsSilent) {
