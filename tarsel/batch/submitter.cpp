@@ -37,7 +37,7 @@ void Submitter::submit() {
         } catch (const Failure& failed) {
             if (submitted_ == 0) throw;
             throw failure(Msg::schedulerPartly,
-                          {std::to_string(submitted_), std::to_string(due_), failed.what()});
+                          {file_.shown(), std::to_string(submitted_), std::to_string(due_), failed.what()});
         }
         submitted_ += array.tasks.size();
     }

@@ -393,7 +393,7 @@ constexpr Message kMessages[] = {
     {Msg::schedulerRefuses,    Exit::failed, "{file} refuses",                        "{system}",                                                  "correct what it names, or ask those who run the cluster"},
     {Msg::schedulerWord,       Exit::usage,  "{name} is no option of the scheduler",  "each word after -- begins with '-'",                        "write a value as a part of its option, as --partition=NAME"},
     {Msg::schedulerOwnOption,  Exit::usage,  "{name} can't be given",                 "the tool sets it itself, or could not find its tasks again", "leave it out"},
-    {Msg::schedulerPartly,     Exit::failed, "{text} of {text} tasks are submitted",  "{text}",                                                    "submit again when that is solved; what is queued is left as it is"},
+    {Msg::schedulerPartly,     Exit::failed, "{file} is submitted in part",           "after {text} of {text} tasks {text}",                       "submit again when that is solved; what is queued is left as it is"},
     {Msg::schedulerUnknown,    Exit::usage,  "can't submit {file}",                   "no scheduler is named",                                     "give --slurm"},
     {Msg::schedulerSilent,     Exit::done,   "{file}",                                "what waits or runs on the cluster is not known ({text})",   ""},
     {Msg::schedulerNothing,    Exit::done,   "{file}",                                "the scheduler has none of its tasks",                       ""},

@@ -201,7 +201,7 @@ TEST_F(FakeSlurm, OneThatRefusesOrIsSilent) {
     EXPECT_EQ(count("waiting"), 3u);
     fs::remove(folder.file("bin/refuse1"));
     folder.write("bin/refuse3", "");
-    failsAs(1, submit({"--array-size", "1"}), {"2 of 3 tasks are submitted", "no such partition"}, "partly");
+    failsAs(1, submit({"--array-size", "1"}), {"in part: after 2 of 3 tasks", "no such partition"}, "partly");
     EXPECT_EQ(count("queued"), 2u);
     EXPECT_EQ(count("waiting"), 1u);
     // Without an answer nothing is submitted, as it may be in the queue.
