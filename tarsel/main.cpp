@@ -125,7 +125,7 @@ int run(int argc, char** argv) {
     if (log == "stderr" && Events::get().descriptor() == 2)
         throw failure(Msg::optionsExclude, {"--log stderr", "--progress json"});
     std::vector<std::string> common;
-    if (!plugins.empty()) common.insert(common.end(), {"--plugins", plugins});
+    if (!plugins.empty()) common.insert(common.end(), {"--plugins", absoluteName(plugins)});
     if (noPlugins) common.emplace_back("--no-plugins");
     if (allowUnsafePlugins) common.emplace_back("--allow-unsafe-plugins");
     ChildProcess::passOn(common);

@@ -39,14 +39,15 @@ QvBatchList BatchFile::load() const {
                                                      : "it holds no list of tasks"});
 }
 
-Descriptor BatchFile::handOver(const QvBatchList& list, size_t index) {
+Descriptor BatchFile::handOver(const QvBatchList& list, const std::vector<size_t>& indexes) {
     Descriptor file = fileInMemory();
     const std::string name = nameOfDescriptor(file.get());
-    AnyVector one;
-    one.append(static_cast<const AnyVector&>(list).at(static_cast<int>(index)));
+    AnyVector some;
+    for (const size_t index : indexes)
+        some.append(static_cast<const AnyVector&>(list).at(static_cast<int>(index)));
     errno = 0;
     try {
-        if (XmlParser::storeDict(Any(name.c_str()), AnyDict("taskList", one), "BatchList", "2.0") ==
+        if (XmlParser::storeDict(Any(name.c_str()), AnyDict("taskList", some), "BatchList", "2.0") ==
             QvStatus::ok)
             return file;
     } catch (const QvFileException&) {
@@ -54,11 +55,15 @@ Descriptor BatchFile::handOver(const QvBatchList& list, size_t index) {
     throw systemFailure(Msg::batchNotWritten, "memory", errno != 0 ? errno : EIO);
 }
 
-BatchTask BatchFile::handedTask(int descriptor, int number) const {
+std::vector<BatchTask> BatchFile::handedTasks(int descriptor, const std::vector<int>& numbers) const {
     QvBatchList list;
-    if (list.load(Any(nameOfDescriptor(descriptor).c_str())) != QvStatus::ok || list.size() != 1)
+    if (list.load(Any(nameOfDescriptor(descriptor).c_str())) != QvStatus::ok ||
+        static_cast<size_t>(list.size()) != numbers.size())
         throw failure(Msg::batchUnreadable, {shown_, "no task was handed over"});
-    return batchTask(list.at(0), number, folder());
+    std::vector<BatchTask> tasks;
+    for (const Any& stored : list)
+        tasks.push_back(batchTask(stored.asDict(), numbers[tasks.size()], folder()));
+    return tasks;
 }
 
 std::vector<BatchTask> BatchFile::tasksOf(const QvBatchList& list) const {

@@ -2,7 +2,9 @@
 //
 //     night.xml              the list
 //     night.xml.lock         locked while a run of the tool changes the list
-//     night.xml.journal.d/   what was done: a file for each task, and the lock of the run
+//     night.xml.journal.d/   what was done: a file for each task, the lock of the run, and for batches on a
+//                            cluster "queue", and for each array its tasks and what its
+//                            elements print
 #pragma once
 
 #include <functional>
@@ -21,6 +23,10 @@ class BatchFile {
     const std::string& name() const { return name_; }    // absolute
     std::string folder() const;                          // that relative names in the list count from
     std::string runLock() const { return journalFolder() + "run"; }
+    std::string queue() const { return journalFolder() + "queue"; }  // what a scheduler was given
+    // To which the elements of an array of this name print, and their tasks; see snapshot.h.
+    std::string elementOutput(const std::string& array) const { return journalFolder() + array + ".txt"; }
+    std::string elementTasks(const std::string& array) const { return journalFolder() + array + ".xml"; }
     std::string journal(const std::string& id) const { return journalFolder() + id; }
 
     // Throws Failure (input) for a file that can't be read or is no list.
@@ -28,10 +34,10 @@ class BatchFile {
     // Its tasks, without their states.
     std::vector<BatchTask> tasks() const { return tasksOf(load()); }
     std::vector<BatchTask> tasksOf(const QvBatchList& list) const;
-    // One task of the list as a document of its own, for a process that need not read the whole list; and
-    // that task there. Both throw Failure.
-    static Descriptor handOver(const QvBatchList& list, size_t index);
-    BatchTask handedTask(int descriptor, int number) const;
+    // Some tasks of the list as a document of its own, for a process that need not read the whole list; and
+    // these tasks there, with the numbers that they have in the list. Both throw Failure.
+    static Descriptor handOver(const QvBatchList& list, const std::vector<size_t>& indexes);
+    std::vector<BatchTask> handedTasks(int descriptor, const std::vector<int>& numbers) const;
     // Makes an empty list. Throws Failure (output) if the file exists, unless `overwrite`.
     void make(bool overwrite) const;
     // Loads the list, changes it and puts it in the place of the old one, while no other run can. The file

@@ -138,7 +138,7 @@ void BatchRunner::startChild(Entry& entry) {
     entry.result.start = secondsSince1970();
     entry.timedOut = entry.killed = false;
     try {
-        const Descriptor task = BatchFile::handOver(list_, static_cast<size_t>(entry.task.number) - 1);
+        const Descriptor task = BatchFile::handOver(list_, {static_cast<size_t>(entry.task.number) - 1});
         const std::lock_guard guard(lock_);
         entry.child = std::make_unique<ChildTask>(words, task);
         // A pause is one within the task, wherever it came.

@@ -48,9 +48,22 @@ void requireSound(const BatchTask& task, const std::string& shown) {
     if (!task.isPlanned()) return;
     const QvTaskFault fault = QvTaskFile::check(task.state);
     if (fault.status == QvStatus::outOfMemory) throw std::bad_alloc();
-    if (fault.status != QvStatus::ok)
-        throw failure(Msg::batchTaskDamaged,
-                      {shown, fault.path.empty() ? fault.reason : fault.path + ": " + fault.reason});
+    if (fault.status == QvStatus::ok) return;
+    const Msg kind = fault.status == QvStatus::failed ? Msg::batchTaskLacks : Msg::batchTaskDamaged;
+    throw failure(kind, {shown, fault.path.empty() ? fault.reason : fault.path + ": " + fault.reason});
+}
+
+void requireFonts(const AnyDict& state, const std::string& shown) {
+    const char* family = state.getString("font_family");
+    if (family && *family && !qv_registry()->hasFontFamily(family))
+        throw failure(Msg::batchTaskLacks, {shown, "there is no font '" + std::string(family) + "' here"});
+    const auto look = [&](const Any& value) {
+        if (value.isDict()) requireFonts(value.asDict(), shown);
+        if (!value.isVector()) return;
+        for (const Any& one : value.asVector())
+            if (one.isDict()) requireFonts(one.asDict(), shown);
+    };
+    for (auto [key, value] : state) look(*value);
 }
 
 void tidyAfter(const BatchTask& task, const OutputPolicy& policy) {
@@ -108,6 +121,7 @@ void TaskRun::run(const BatchFile& file, const BatchTask& task, Signals& signals
     OutputPolicy policy = job.policy;
     policy.placing = [&](const std::vector<PlacedFile>& files) { journal.placing(files); };
     try {
+        if (ready) ready();
         carryOut(file, task, policy, signals);
     } catch (const Failure& failed) {
         // What -n keeps is not this task's work.

@@ -6,9 +6,10 @@
 #include <set>
 
 #include "tarsel/batch/batchfile.h"
-#include "tarsel/batch/journal.h"
 #include "tarsel/batch/order.h"
 #include "tarsel/batch/taskrun.h"
+#include "tarsel/batch/taskstate.h"
+#include "tarsel/cluster/slurm.h"
 #include "tarsel/commands/batchcommands.h"
 #include "tarsel/commands/commands.h"
 #include "tarsel/host/console.h"
@@ -91,31 +92,6 @@ void removeTasks(const BatchFile& file, const Words& words) {
 
 // --- What is there
 
-struct State {
-    const char* name;
-    TaskRecord record;
-};
-
-State stateOf(const BatchFile& file, const BatchTask& task) {
-    using Step = TaskRecord::Step;
-    const std::string journal = file.journal(task.id);
-    State state{"waiting", TaskRecord::read(journal)};
-    const Step last = state.record.last;
-    if (last != Step::none && RecordFile::isLocked(journal))
-        state.name = "running";
-    else if (!task.enabled)
-        state.name = "disabled";
-    else if (state.record.isDone(keyOf(task), false))
-        state.name = "done";
-    else if (last == Step::done)
-        state.name = "changed";
-    else if (last == Step::failed)
-        state.name = "failed";
-    else if (last != Step::none)
-        state.name = "interrupted";
-    return state;
-}
-
 Json rowOf(const BatchTask& task) {
     Json row = Json::object();
     row["number"] = task.number;
@@ -150,18 +126,24 @@ void status(const BatchFile& file, bool json) {
     Json rows = Json::array();
     std::map<std::string, size_t> counts;
     const Tasks tasks = file.tasks();
+    const SlurmScheduler scheduler;
+    TaskStates states(file, scheduler);
     for (const BatchTask& task : tasks) {
-        const State state = stateOf(file, task);
+        const TaskState state = states.of(task);
         ++counts[state.name];
         const bool failed = state.name == std::string_view("failed");
+        const std::string end = states.endOf(task, state), job = states.jobOf(task);
         if (!json) {
             printRow(task, state.name);
             if (failed) printText("\t" + state.record.failure + "\n");
+            if (!end.empty()) printText("\tthe scheduler: " + end + "\n");
             continue;
         }
         Json row = rowOf(task);
         row["state"] = state.name;
         row["status"] = failed ? Json(state.record.status) : Json(nullptr);
+        row["job"] = job.empty() ? Json(nullptr) : Json(job);
+        row["end"] = end.empty() ? Json(nullptr) : Json(validUtf8(end));
         row["error"] = failed ? Json(validUtf8(state.record.failure)) : Json(nullptr);
         rows.push_back(row);
     }
@@ -260,4 +242,5 @@ void addBatch(CommandLine& line, Signals& signals, const std::string& version,
     checking.action([name] { Check(BatchFile(*name)).run(); });
     showing("status", "Show what was done and what is left", status);
     addBatchRun(batch, signals, name, version, log);
+    addBatchCluster(batch, name, log);
 }

@@ -19,6 +19,9 @@ void addBatchAdd(Command& batch, Signals& signals, const ListName& list,
 void addBatchRun(Command& batch, Signals& signals, const ListName& list, const std::string& version,
                  const std::string& log);
 
+// submit and cancel.
+void addBatchCluster(Command& batch, const ListName& list, const std::string& log);
+
 // Makes the words of a job that was added before it could be planned its options. What `job` says of how it
 // is run stays. Throws Failure.
 void planWords(const std::vector<std::string>& words, JobOptions& job);

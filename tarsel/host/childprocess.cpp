@@ -67,6 +67,7 @@ std::vector<std::string>& passedOn() {
 }  // namespace
 
 void ChildProcess::passOn(std::vector<std::string> arguments) { passedOn() = std::move(arguments); }
+const std::vector<std::string>& ChildProcess::passed() { return passedOn(); }
 
 ChildProcess::ChildProcess(const std::vector<std::string>& arguments, Stream captured, int handed) {
     std::vector<char*> words = {const_cast<char*>("tarsel")};
@@ -154,10 +155,28 @@ void waitForAny(std::span<const int> descriptors, int milliseconds) {
     poll(all.data(), all.size(), milliseconds);
 }
 
-Descriptor fileInMemory() {
+Descriptor fileInMemory(const std::string& text) {
     Descriptor file(memfd_create("tarsel", MFD_CLOEXEC));
     if (!file) throw systemFailure(Msg::childNotStarted, "memfd", errno);
+    for (size_t at = 0; at < text.size();) {
+        const ssize_t written =
+            pwrite(file.get(), text.data() + at, text.size() - at, static_cast<off_t>(at));
+        if (written < 0 && errno == EINTR) continue;
+        if (written <= 0) throw systemFailure(Msg::childNotStarted, "memfd", errno);
+        at += static_cast<size_t>(written);
+    }
     return file;
+}
+
+std::string contentsOf(const Descriptor& file) {
+    std::string text;
+    for (char block[65536];;) {
+        const ssize_t got = pread(file.get(), block, sizeof block, static_cast<off_t>(text.size()));
+        if (got > 0)
+            text.append(block, static_cast<size_t>(got));
+        else if (got == 0 || errno != EINTR)
+            return text;
+    }
 }
 
 std::string nameOfDescriptor(int descriptor) { return "/proc/self/fd/" + std::to_string(descriptor); }

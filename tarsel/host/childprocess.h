@@ -21,6 +21,7 @@ class ChildProcess {
 
     // What all of them get in front of their arguments. Once, before the first.
     static void passOn(std::vector<std::string> arguments);
+    static const std::vector<std::string>& passed();
     // `arguments`: those of the tool. `handed`: an open descriptor that becomes its descriptor kHanded, or
     // -1. Throws Failure if there is no room for another process.
     ChildProcess(const std::vector<std::string>& arguments, Stream captured, int handed = -1);
@@ -66,7 +67,9 @@ class Bell {
 // Until one of them can be read, or so many milliseconds have passed; negative: without an end.
 void waitForAny(std::span<const int> descriptors, int milliseconds);
 
-// A file without a name that is gone when its last descriptor is closed. Throws Failure.
-Descriptor fileInMemory();
+// A file without a name that is gone when its last descriptor is closed, with this in it. Throws Failure.
+Descriptor fileInMemory(const std::string& text = "");
+// All that a file holds, from its first byte on.
+std::string contentsOf(const Descriptor& file);
 // By which it can be opened.
 std::string nameOfDescriptor(int descriptor);

@@ -1,8 +1,10 @@
-// A command of the shell that this program starts, waits for, and passes signals on to.
+// What this program starts and waits for: commands of the shell, to which it passes signals on, and other
+// programs, which it asks.
 #pragma once
 
 #include <mutex>
 #include <string>
+#include <vector>
 
 #include <sys/types.h>
 
@@ -29,3 +31,19 @@ class ShellCommand {
     pid_t group_ = -1;
     bool ended_ = false;
 };
+
+struct Answer {
+    int status = 0;  // the exit status, or 128 + N after signal N
+    std::string out, err;
+};
+
+// `words`: the program, which is looked for in PATH, and its arguments. `input`: all that it reads. Variables
+// of the environment whose names begin with one of `without` are kept from it. In a process group of its own,
+// so that the keys of a terminal don't reach it; one that takes longer than so many seconds is killed. Throws
+// Failure (module) if there is no such program, and Failure (failed) if it can't be started or takes too
+// long.
+Answer askProgram(const std::vector<std::string>& words, const std::string& input, double seconds,
+                  const std::vector<std::string>& without = {});
+
+// The file of this process's own program.
+std::string ownProgram();

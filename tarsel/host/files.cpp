@@ -79,11 +79,14 @@ Failure failureOf(const std::system_error& error) {
     return failure(Msg::pathFailed, {path.substr(0, path.find("/.tarsel-")), cause.why, cause.remedy});
 }
 
-std::string firstBytes(const std::string& name, size_t most) {
+std::string firstBytes(const std::string& name, size_t most) { return bytesAt(name, 0, most); }
+
+std::string bytesAt(const std::string& name, long long from, size_t most) {
     std::string bytes(most, '\0');
     FILE* file = std::fopen(name.c_str(), "rb");
     if (!file) refuseInput(name, errno);
     errno = 0;
+    if (from > 0) std::fseek(file, static_cast<long>(from), SEEK_SET);
     bytes.resize(std::fread(bytes.data(), 1, most, file));
     const int error = errno;
     std::fclose(file);

@@ -26,6 +26,9 @@ Failure failureOf(const std::system_error& error);
 // The first bytes of a file, fewer where it ends before. A file that can't be read is refused.
 std::string firstBytes(const std::string& name, size_t most);
 
+// So many bytes of a file from a place on, fewer where it ends before. Throws Failure (input).
+std::string bytesAt(const std::string& name, long long from, size_t most);
+
 // Throws Failure (output) if the name of an output is that of a folder, with the name of a file in it as a
 // hint.
 void requireNoFolder(const std::string& name, const std::string& extension);

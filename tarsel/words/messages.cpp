@@ -358,6 +358,8 @@ constexpr Message kMessages[] = {
     {Msg::pluginEndedAll,   Exit::module, "the plug-in {file} ended the program while it was loaded", "{text}",                                "remove it, or get another version of it"},
     // batches
     {Msg::childNotStarted,     Exit::failed, "can't start {file}",                    "{text}",                                                    "{text}"},
+    {Msg::programMissing,      Exit::module, "can't start {file}",                    "there is no such program in PATH",                          "install it, or go to a machine that has it"},
+    {Msg::programSilent,       Exit::failed, "{file} was stopped",                    "it did not end within {text} s",                            "try again when it answers"},
     {Msg::batchRuns,           Exit::failed, "can't run {file}",                      "process {text} on {text} runs it",                          "wait for it, or stop that one"},
     {Msg::batchUnreadable,     Exit::input,  "{file} is no list of tasks",            "{system}",                                                  "check the name, or make a list with 'tarsel batch LIST new'"},
     {Msg::batchExists,         Exit::output, "can't make {file}",                     "it exists",                                                 "give -y to empty it, or another name"},
@@ -366,6 +368,7 @@ constexpr Message kMessages[] = {
     {Msg::batchIdShort,        Exit::usage,  "{file} has no task {name}",             "a name of a task has at least 8 digits",                    "'tarsel batch LIST list' shows all"},
     {Msg::batchIdOpen,         Exit::usage,  "{name} is not one task",                "several tasks of {file} begin so",                          "give more digits"},
     {Msg::batchTaskDamaged,    Exit::input,  "{file} is damaged",                     "{system}",                                                  "remove the task and add it again"},
+    {Msg::batchTaskLacks,      Exit::module, "can't run {file}",                      "{system}",                                                  "install it here, or run the task where it is"},
     {Msg::batchOutputTwice,    Exit::usage,  "can't add {file}",                      "task {text} writes it",                                     "give another name, or remove that task"},
     {Msg::batchOutputStream,   Exit::usage,  "can't add {file}",                      "the standard output is none of a batch",                    "give -o the name of a file"},
     {Msg::batchNoFiles,        Exit::input,  "--files {name}",                        "there is no such file",                                     "check the pattern; in quotes, so that the shell leaves it as it is"},
@@ -386,6 +389,14 @@ constexpr Message kMessages[] = {
     {Msg::batchStopped,        Exit::interrupted, "stopped",                          "{text} of {text} tasks of {file} are done",                 "the next run does what is left"},
     {Msg::batchNotNoted,       Exit::done,   "{file}",                                "the journal can't be written ({text})",                     "the next run looks at the outputs again"},
     {Msg::batchEmpty,          Exit::input,  "can't run {file}",                      "it has no tasks",                                           "add some with 'tarsel batch LIST add'"},
+    // batches on a cluster
+    {Msg::schedulerRefuses,    Exit::failed, "{file} refuses",                        "{system}",                                                  "correct what it names, or ask those who run the cluster"},
+    {Msg::schedulerWord,       Exit::usage,  "{name} is no option of the scheduler",  "each word after -- begins with '-'",                        "write a value as a part of its option, as --partition=NAME"},
+    {Msg::schedulerOwnOption,  Exit::usage,  "{name} can't be given",                 "the tool sets it itself, or could not find its tasks again", "leave it out"},
+    {Msg::schedulerPartly,     Exit::failed, "{file} is submitted in part",           "after {text} of {text} tasks {text}",                       "submit again when that is solved; what is queued is left as it is"},
+    {Msg::schedulerUnknown,    Exit::usage,  "can't submit {file}",                   "no scheduler is named",                                     "give --slurm"},
+    {Msg::schedulerSilent,     Exit::done,   "{file}",                                "what waits or runs on the cluster is not known ({text})",   ""},
+    {Msg::schedulerNothing,    Exit::done,   "{file}",                                "the scheduler has none of its tasks",                       ""},
     // watched folders
     {Msg::watchNoFolder,       Exit::input,  "can't watch {file}",                 "{text}",                                              "{text}"},
     {Msg::watchFolderMissing,  Exit::usage,  "--preset {name}",                    "no folder follows the colon",                         "write NAME:FOLDER, or NAME alone"},

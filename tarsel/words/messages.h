@@ -358,6 +358,8 @@ enum class Msg : unsigned short {
     pluginEndedAll,
     // batches
     childNotStarted,
+    programMissing,
+    programSilent,
     batchRuns,
     batchUnreadable,
     batchExists,
@@ -366,6 +368,7 @@ enum class Msg : unsigned short {
     batchIdShort,
     batchIdOpen,
     batchTaskDamaged,
+    batchTaskLacks,
     batchOutputTwice,
     batchOutputStream,
     batchNoFiles,
@@ -386,6 +389,14 @@ enum class Msg : unsigned short {
     batchStopped,
     batchNotNoted,
     batchEmpty,
+    // batches on a cluster
+    schedulerRefuses,
+    schedulerWord,
+    schedulerOwnOption,
+    schedulerPartly,
+    schedulerUnknown,
+    schedulerSilent,
+    schedulerNothing,
     // watched folders
     watchNoFolder,
     watchFolderMissing,

@@ -1,0 +1,154 @@
+#include "tarsel/cluster/slurm.h"
+
+#include <algorithm>
+#include <charconv>
+#include <optional>
+#include <set>
+#include <sstream>
+
+#include "tarsel/host/command.h"
+#include "tarsel/words/messages.h"
+
+namespace {
+
+using Words = std::vector<std::string>;
+
+constexpr double kPatience = 60;          // seconds for what changes something
+constexpr double kQuestionPatience = 30;  // for the queue
+constexpr double kShortPatience = 5;      // for what may be left out
+
+// Variables by which a user makes the answers of these programs other ones.
+const Words& ownVariables() {
+    static const Words prefixes = {"SQUEUE_",      "SCANCEL_",         "SACCT_",         "SBATCH_ARRAY_INX=",
+                                   "SBATCH_WAIT=", "SBATCH_CLUSTERS=", "SLURM_CLUSTERS="};
+    return prefixes;
+}
+
+// Options of sbatch that are this tool's own, or after which the array is none that it can follow.
+constexpr struct {
+    const char *shortName, *longName;
+} kOwnOptions[] = {
+    {"-J", "--job-name"},    {"-a", "--array"},        {"-d", "--dependency"},
+    {"-M", "--clusters"},    {"-W", "--wait"},         {nullptr, "--wrap"},
+    {nullptr, "--parsable"}, {nullptr, "--test-only"}, {"-h", "--help"},
+    {nullptr, "--usage"},    {"-V", "--version"},      {nullptr, "--no-kill-on-invalid-dep"},
+};
+constexpr size_t kShortestPrefix = 4;  // of a long option that getopt takes for the whole
+
+bool isOwn(const std::string& word) {
+    const std::string name = word.substr(0, word.find('='));
+    return std::any_of(std::begin(kOwnOptions), std::end(kOwnOptions), [&](const auto& own) {
+        if (own.shortName && word.starts_with(own.shortName)) return true;
+        const std::string whole = own.longName;
+        return name.size() >= kShortestPrefix && whole.starts_with(name);
+    });
+}
+
+// In a name of an output '%' begins what Slurm puts in, and '\' ends that.
+std::string outputName(const std::string& name) {
+    if (name.find('\\') != std::string::npos) return "/dev/null";
+    std::string pattern;
+    for (const char c : name) pattern += c == '%' ? std::string("%%") : std::string(1, c);
+    return pattern;
+}
+
+std::optional<size_t> indexOf(const std::string& text) {
+    size_t index = 0;
+    const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), index);
+    if (error != std::errc() || end != text.data() + text.size()) return std::nullopt;
+    return index;
+}
+
+Words fieldsOf(const std::string& line, char separator) {
+    Words fields;
+    std::istringstream text(line);
+    for (std::string field; std::getline(text, field, separator);) fields.push_back(field);
+    return fields;
+}
+
+Answer ask(const Words& words, const std::string& input, double seconds) {
+    return askProgram(words, input, seconds, ownVariables());
+}
+
+Answer askSurely(const Words& words, const std::string& input, double seconds) {
+    Answer answer = ask(words, input, seconds);
+    const std::string why = answer.err.empty() ? "it says nothing" : inLine(answer.err);
+    if (answer.status != 0) throw failure(Msg::schedulerRefuses, {words[0], why});
+    return answer;
+}
+
+}  // namespace
+
+std::string SlurmScheduler::indexWord() const { return "\"$SLURM_ARRAY_TASK_ID\""; }
+std::string SlurmScheduler::coresWord() const {
+    return "\"${SLURM_CPUS_ON_NODE:-${SLURM_CPUS_PER_TASK:-1}}\"";
+}
+
+// A word that is no option would be taken for the script, so values have to be parts of their options.
+void SlurmScheduler::checkOptions(const Words& options) const {
+    for (const std::string& word : options) {
+        if (word.size() < 2 || word[0] != '-' || word == "--") throw failure(Msg::schedulerWord, {word});
+        if (isOwn(word)) throw failure(Msg::schedulerOwnOption, {word});
+    }
+}
+
+std::string SlurmScheduler::submit(const ClusterArray& array) const {
+    Words words = {"sbatch",
+                   "--parsable",
+                   "--job-name=" + array.name,
+                   "--array=0-" + std::to_string(array.size - 1) +
+                       (array.atOnce > 0 ? "%" + std::to_string(array.atOnce) : ""),
+                   "--output=" + outputName(array.output),
+                   "--open-mode=append"};
+    if (!array.after.empty()) words.push_back("--dependency=afterany:" + joined(array.after, ":"));
+    words.insert(words.end(), array.options.begin(), array.options.end());
+    const Answer answer = askSurely(words, array.script, kPatience);
+    // "123" or "123;cluster"
+    const std::string job = answer.out.substr(0, answer.out.find_first_of(";\n"));
+    if (!indexOf(job)) throw failure(Msg::schedulerRefuses, {words[0], inLine(answer.out + answer.err)});
+    return job;
+}
+
+std::vector<ClusterElement> SlurmScheduler::elements(const Words& arrays) const {
+    std::vector<ClusterElement> elements;
+    if (arrays.empty()) return elements;
+    const std::set<std::string> wanted(arrays.begin(), arrays.end());
+    const Answer answer =
+        askSurely({"squeue", "--noheader", "--array", "--format=%j|%F|%K|%T"}, "", kQuestionPatience);
+    for (const std::string& line : fieldsOf(answer.out, '\n')) {
+        const Words fields = fieldsOf(line, '|');
+        if (fields.size() != 4 || !wanted.count(fields[0])) continue;
+        if (const auto index = indexOf(fields[2]))
+            elements.push_back({fields[0], fields[1], *index, fields[3] == "PENDING"});
+    }
+    return elements;
+}
+
+std::map<std::pair<std::string, size_t>, std::string> SlurmScheduler::ends(const Words& arrays) const {
+    std::map<std::pair<std::string, size_t>, std::string> ends;
+    if (arrays.empty()) return ends;
+    Answer answer;
+    try {
+        answer = ask({"sacct", "--noheader", "--allocations", "--parsable2", "--starttime=now-30days",
+                      "--name=" + joined(arrays, ","), "--format=JobName,JobID,State"},
+                     "", kShortPatience);
+    } catch (const Failure&) {
+        return ends;
+    }
+    if (answer.status != 0) return ends;
+    for (const std::string& line : fieldsOf(answer.out, '\n')) {
+        const Words fields = fieldsOf(line, '|');
+        if (fields.size() != 3) continue;
+        const size_t at = fields[1].find('_');
+        if (const auto index = at == std::string::npos ? std::nullopt : indexOf(fields[1].substr(at + 1)))
+            ends[{fields[0], *index}] = fields[2];
+    }
+    return ends;
+}
+
+void SlurmScheduler::cancel(const Words& jobs) const {
+    if (jobs.empty()) return;
+    Words words = {"scancel", "--quiet"};
+    words.insert(words.end(), jobs.begin(), jobs.end());
+    askSurely(words, "", kPatience);
+}
