@@ -48,6 +48,7 @@ QvBuiltinModule::QvBuiltinModule(const QvBuiltinRow& row)
     if (more.priority) setAttr("priority", more.priority);
     if (more.skipAuto) setAttr("skipAuto", 1);
     if (more.internal) setAttr("internal", 1);
+    if (more.preroll) setAttr("preroll", more.preroll);
     if (more.inFourcc) setAttr("inFOURCC", fourccs(more.inFourcc));
 }
 

@@ -9,6 +9,7 @@ struct QvBuiltinAttributes {
     int priority = 0;                // of a decoder, the smallest is tried first; 0: no attribute
     bool skipAuto = false;           // never chosen by extension
     bool internal = false;           // not offered to users
+    int preroll = 0;                 // frames in front that a filter's frame depends on; 0: no attribute
     const char* inFourcc = nullptr;  // formats that a video encoder takes, stored as FOURCC numbers
 };
 

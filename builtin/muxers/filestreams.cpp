@@ -107,7 +107,7 @@ class FileFeed {
 };
 
 std::string FileFeed::begin(QvMuxer& muxer) {
-    file_ = qvFileSource(stream_.file, 1);
+    file_ = stream_.parts.empty() ? qvFileSource(stream_.file, 1) : qvFilePartsSource(stream_.parts, 1);
     length_ = file_ ? file_->size() : QvByteSource::unknown;
     if (length_ < 1) return "it can't be opened, or is empty";
     if (std::string why = measure(); !why.empty()) return why;
@@ -244,7 +244,7 @@ int FileMultiplexer::checkNames() {
     if (!names.isVector()) return QvStatus::ok;
     for (const Any& name : names.asVector())
         for (std::size_t i = 0; i < config_.streams.size(); ++i)
-            if (QvFile::isSameFile(name, config_.streams[i].file)) return fail(i, "it is an output, too");
+            if (config_.streams[i].reads(name)) return fail(i, "it is an output, too");
     return QvStatus::ok;
 }
 

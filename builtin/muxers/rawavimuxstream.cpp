@@ -7,6 +7,7 @@
 #include "builtin/shared/rawoutput.h"
 #include "core/engine/files/qvfileutil.h"
 #include "core/engine/status.h"
+#include "core/measure/exactmath_p.h"
 #include "core/stream/buf_impl_base.h"
 #include "core/stream/iofailure.h"
 
@@ -65,7 +66,8 @@ bool AviInterleaver::writeSound(size_t track, int64_t samples) {
     return true;
 }
 
-// All sound before the time up to which every picture is written.
+// All sound before the time up to which every picture is written, in the whole samples in which a job makes
+// it: so a file is the same whether its sound comes frame by frame or all at once.
 bool AviInterleaver::writeDueSound() {
     for (size_t i = 0; i < feeds_.size(); ++i) {
         const auto& sound = file_.track(i);
@@ -74,8 +76,7 @@ bool AviInterleaver::writeDueSound() {
         for (size_t v = 0; v < feeds_.size(); ++v) {
             const auto& video = file_.track(v);
             if (!video.video) continue;
-            const double seconds = static_cast<double>(video.units) * video.scale / video.rate;
-            due = std::min(due, static_cast<int64_t>(seconds * sound.rate + 0.5));
+            due = std::min<int64_t>(due, qvmath::mulDiv(video.units, sound.rate, video.scale, video.rate));
         }
         if (!writeSound(i, due - sound.units)) return false;
     }

@@ -22,8 +22,9 @@
 
 namespace {
 
-constexpr char exactNameKey[] = "exactName";
+constexpr char exactNameKey[] = "exactName", firstKey[] = "firstPicture", allKey[] = "allPictures";
 constexpr char nameMissing[] = "[rawmux] Output filename not set";
+constexpr int mostPictures = 1'000'000'000;
 constexpr int mostStreams = 99;  // their numbers have two digits
 
 using Settings = RawMux::Settings;
@@ -49,6 +50,17 @@ constexpr QvParamRow<Settings> settingRows[] = {
     {.name = exactNameKey,
      .member = &Settings::exactName,
      .help = "the one stream goes to filename as it is"},
+    {.name = firstKey,
+     .member = &Settings::firstPicture,
+     .min = 0,
+     .max = mostPictures,
+     .help = "with splitVideo: the number of the first file"},
+    {.name = allKey,
+     .member = &Settings::allPictures,
+     .min = 0,
+     .max = mostPictures,
+     .help =
+         "with splitVideo: files of the whole sequence, for the width of the numbers; 0: those of the job"},
     {"type", {}, qvParamIgnored},
     {"_totalFrames", &Settings::totalFrames},
 };
@@ -94,11 +106,18 @@ void RawMux::store(AnyDict& state) const {
     state.set("name", name());
     qvStoreParamRows<Settings>(settingRows, settings_, state);
     if (settings_.exactName) state.set(exactNameKey, 1);
+    if (settings_.firstPicture > 0) state.set(firstKey, settings_.firstPicture);
+    if (settings_.allPictures > 0) state.set(allKey, settings_.allPictures);
 }
 
 int RawMux::restore(const AnyDict& state) {
     if (!(state.get("name") == name())) return setError(QvStatus::failed, "restore - invalid name");
     if (state.isSet(exactNameKey)) settings_.exactName = state.get(exactNameKey).isTrue();
+    for (const char* key : {firstKey, allKey})
+        if (state.isSet(key))
+            if (const auto result = _setRow<Settings>(settingRows, settings_, key, state.get(key));
+                result && *result != QvStatus::ok)
+                return *result;
     return _restoreRows<Settings>(settingRows, settings_, state);
 }
 
@@ -210,12 +229,11 @@ int RawMux::openVideo(int nr) {
     const bool raw = traits.uncompressed;
     const bool split = settings_.splitVideo && (raw || traits.wholePictures);
     const bool png = split && settings_.rawAsPng && raw;
-    const int digits =
-        settings_.totalFrames >= 1
-            ? static_cast<int>(std::ceil(std::log10(static_cast<double>(settings_.totalFrames))) + 0.1)
-            : 0;
+    const int all = settings_.allPictures > 0 ? settings_.allPictures : settings_.totalFrames;
+    const int digits = all >= 1 ? static_cast<int>(std::ceil(std::log10(static_cast<double>(all))) + 0.1) : 0;
     output.setParam("split", split ? 1 : 0);
     output.setParam("nrDigits", digits);
+    output.setParam("firstNumber", settings_.firstPicture);
     const auto size = output.getParam("size");
     if (split && size.isInt32() && size.asInt32() > 0) output.setParam("chunk", size);
     output.setParam("png", png ? 1 : 0);
@@ -230,6 +248,7 @@ int RawMux::openVideo(int nr) {
     outputs_.push_back(std::make_unique<RawMuxOutput>(
         output, outputName(qvVideoStream, nr), split ? RawMuxOutput::pictureFiles : RawMuxOutput::oneFile,
         digits, png));
+    outputs_.back()->first = settings_.firstPicture;
     return openStream(qvVideoStream, nr, "Unable to open output video file %s");
 }
 

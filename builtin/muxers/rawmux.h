@@ -20,6 +20,9 @@ struct RawMuxOutput;
 //   "splitAudio"     bool    one WAV file for each channel of a raw encoder: a#00.wav, a#01.wav ...
 //   "rawAsPng"       bool    with splitVideo, PNG pictures
 //   "_totalFrames"   int     pictures to come; gives their numbers a common width
+//   "firstPicture"   int     with splitVideo: the number of the first one, for a part of a longer sequence
+//   "allPictures"    int     of that sequence, whose numbers have one width; 0: "_totalFrames" has them all.
+//                            Both are stored only where they are not 0
 //   "filenames"      vector  read only: the names of all streams, enabled or not
 //   "filesWritten"   vector  read only: every file that the last run made, pictures and channels one by one.
 //                            After close with status 0 they are complete; otherwise they are what is left.
@@ -28,6 +31,8 @@ class RawMux : public OwnFilesMuxer {
     struct Settings {
         Any filename;
         int totalFrames = 0;
+        int firstPicture = 0;
+        int allPictures = 0;
         bool splitVideo = false;
         bool splitAudio = false;
         bool rawAsPng = false;

@@ -31,7 +31,7 @@ void RawMuxOutput::appendFiles(AnyVector& files) const {
             break;
         case pictureFiles:
             for (int picture = 0; picture < pictures; ++picture)
-                appendFile(files, numbered(count, picture, png ? Any("png") : extension));
+                appendFile(files, numbered(count, first + picture, png ? Any("png") : extension));
             break;
     }
 }

@@ -34,6 +34,7 @@ struct RawMuxOutput final : QvAuxInfoObserver {
     bool png;
     bool failed = false;  // could not be opened
     int pictures = 0;
+    int first = 0;  // number of the first picture
 
   private:
     Any numbered(int digitCount, int number, const Any& extension) const;

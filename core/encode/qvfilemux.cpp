@@ -1,5 +1,6 @@
 #include "core/encode/qvfilemux.h"
 
+#include <algorithm>
 #include <limits>
 
 #include "core/arch/qvcancel.h"
@@ -98,6 +99,17 @@ long long QvFileMuxStream::wholeBytes(std::string& problem) const {
     return type == qvAudioStream ? static_cast<long long>(channels) * ((bitsPerSample + 7) / 8) : 0;
 }
 
+long long QvFileMuxStream::length() const {
+    if (!parts.empty()) return qvFilePartsBytes(parts);
+    return textOf(file).empty() ? -1 : QvFile::flength(file);
+}
+
+bool QvFileMuxStream::reads(const Any& name) const {
+    if (parts.empty()) return QvFile::isSameFile(name, file);
+    return std::any_of(parts.begin(), parts.end(),
+                       [&](const QvFilePart& part) { return QvFile::isSameFile(name, part.file); });
+}
+
 QvFileMuxStream& QvFileMuxConfig::addStream(int type, const Any& file, const Any& codec) {
     QvFileMuxStream& stream = streams.emplace_back();
     stream.type = type;
@@ -147,7 +159,7 @@ int QvFileMux::checkStream(std::size_t index) {
     if (stream.type != qvVideoStream && stream.type != qvAudioStream && stream.type != qvSubpicStream)
         return refuse("there is no type " + std::to_string(stream.type));
     if (!stream.codec.isText() || stream.codec.size() == 0) return refuse("its codec is not set");
-    const long long length = textOf(stream.file).empty() ? -1 : QvFile::flength(stream.file);
+    const long long length = stream.length();
     if (length < 0) return refuse("it can't be opened, or is no regular file");
     if (length == 0) return refuse("it is empty");
     std::string why = formatProblem(stream);
@@ -159,7 +171,7 @@ int QvFileMux::checkStream(std::size_t index) {
 int QvFileMux::checkOutput(const Any& output) {
     if (textOf(output).empty()) return fail(QvStatus::invalidArgument, "The output has no name");
     for (std::size_t i = 0; i < config_.streams.size(); ++i)
-        if (QvFile::isSameFile(output, config_.streams[i].file))
+        if (config_.streams[i].reads(output))
             return fail(QvStatus::invalidArgument, config_.place(i) + ": it is the output, too");
     return QvStatus::ok;
 }

@@ -18,6 +18,7 @@
 #include "core/arch/api.h"
 #include "core/measure/qvgeometry.h"
 #include "core/measure/streamtype.h"
+#include "core/stream/qvfileparts.h"
 #include "core/value/any.h"
 #include "core/value/anycontainer.h"
 
@@ -27,8 +28,10 @@ class QvMuxer;
 
 // One stream, as coded data from the first to the last byte of a file.
 struct QV_API QvFileMuxStream {
-    int type = 0;                // qvVideoStream, qvAudioStream or qvSubpicStream
-    Any file;                    // the name of a regular file that is not empty
+    int type = 0;  // qvVideoStream, qvAudioStream or qvSubpicStream
+    Any file;      // the name of a regular file that is not empty
+    // If there are any, the data are these, one after the other, and `file` is their name in messages.
+    std::vector<QvFilePart> parts;
     Any codec;                   // name of the encoder that makes such data: "rawvenc"
     Any extension;               // without the dot; not set: the encoder's, else that of the file
     QvFramerate framerate{0.0};  // of video
@@ -45,6 +48,10 @@ struct QV_API QvFileMuxStream {
     // Bytes of a picture, or of one sample of all channels, if the encoder writes them unchanged. 0 for coded
     // data; 0 with a text in `problem` for an invalid format.
     long long wholeBytes(std::string& problem) const;
+    // Of the data; below 0 if a file can't be opened or is no regular file.
+    long long length() const;
+    // Whether it is read from that file.
+    bool reads(const Any& name) const;
 };
 
 // What a multiplexer gets by QvMuxer::muxElementaryStreams, checked by QvFileMux::check.

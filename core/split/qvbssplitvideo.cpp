@@ -45,7 +45,7 @@ int QvBsSplitVideo::init(const AnyDict& newParams) {
     path_ = QvFile::getPath(name);
     extension_ = QvFile::getExt(name, false);
     baseName_ = QvFile::getBasename(name);
-    fileCounter_ = 0;
+    fileCounter_ = params().getInt32("firstNumber", 0);
     png_ = params().get("png").isTrue();
     if (const int status = png_ ? initPictures() : QvStatus::ok) return status;
     ending.dismiss();

@@ -17,12 +17,12 @@ class QvFrame;
 class PictureQueue;
 
 // Parameters: "outfilename"; "split" Int32 0 for a plain file, anything else for files NAME#0.EXT, NAME#1.EXT
-// and so on; "nrDigits" (Int32), width of the number, with zeros in front; "png" true to write each access
-// unit as a PNG picture, which "width", "height" and "FOURCC" describe. "chunk" must hold a whole picture
-// then, and formats other than BGR3 need the module "scaler". "parallel" true: PNG pictures are packed on the
-// engine's pool of threads, several at once. The files are written in order, but later than their units: a
-// failure stops the ring at the next unit, or is in ioError() after destroy(0); destroy(1) drops what is not
-// written yet.
+// and so on; "firstNumber" (Int32) in the place of 0; "nrDigits" (Int32), its width, with zeros in front;
+// "png" true to write each access unit as a PNG picture, which "width", "height" and "FOURCC" describe.
+// "chunk" must hold a whole picture then, and formats other than BGR3 need the module "scaler". "parallel"
+// true: PNG pictures are packed on the engine's pool of threads, several at once. The files are written in
+// order, but later than their units: a failure stops the ring at the next unit, or is in ioError() after
+// destroy(0); destroy(1) drops what is not written yet.
 class QV_API QvBsSplitVideo : public QvBufStreamFifoCb {
   public:
     explicit QvBsSplitVideo(QvCodec* owner = nullptr);

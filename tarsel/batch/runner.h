@@ -8,7 +8,7 @@
 #include <vector>
 
 #include "tarsel/batch/batchfile.h"
-#include "tarsel/batch/childtask.h"
+#include "tarsel/split/childtask.h"
 #include "tarsel/batch/order.h"
 #include "tarsel/batch/result.h"
 #include "tarsel/host/outputs/outputs.h"

@@ -5,6 +5,7 @@
 #include "tarsel/host/signals.h"
 #include "tarsel/job/job.h"
 #include "tarsel/job/storedjob.h"
+#include "tarsel/split/split.h"
 #include "tarsel/words/commandline.h"
 
 namespace {
@@ -14,7 +15,7 @@ struct Given {
     JobOptions job;
     OutputOptions outputs;
     ProgressOption progress;
-    std::string task, output, threads;
+    std::string task, output, threads, split;
     bool allowPost = false;
 };
 
@@ -23,6 +24,7 @@ void run(Given& given, Signals& signals) {
     given.job.policy = given.outputs.policy();
     given.job.policy.recover = !given.job.dryRun;
     given.job.policy.quiet = given.job.quiet;
+    if (!given.split.empty()) given.job.division = makeSplit(given.split);
     runJob(given.job, [&] {
         JobOptions job = given.job;
         job.output = given.output;
@@ -45,6 +47,7 @@ void addRun(CommandLine& line, Signals& signals, const std::string& version) {
     given->progress.add(command);
     command.flag("--accept-partial", job.acceptPartial, "Accept a damaged input and take what can be read");
     command.flag("--strict", job.strict, "Let the job fail if there is a warning");
+    command.option("--split", given->split, "Make the picture in N parts, side by side", "N");
     addThreads(command, given->threads);
     command.flag("--dry-run", job.dryRun, "Print the plan and do nothing");
     given->outputs.add(command);

@@ -11,6 +11,7 @@
 #include "tarsel/job/post.h"
 #include "tarsel/presets/codecnames.h"
 #include "tarsel/presets/presetchoice.h"
+#include "tarsel/split/split.h"
 #include "tarsel/words/commandline.h"
 #include "tarsel/words/keyvalues.h"
 #include "tarsel/words/messages.h"
@@ -22,7 +23,7 @@ namespace {
 struct Given : GivenJob {
     OutputOptions outputs;
     ProgressOption progress;
-    std::string threads, inputFormat;
+    std::string threads, inputFormat, split;
 };
 
 int parseBits(const std::string& text) {
@@ -108,6 +109,12 @@ void takeStandardInput(Given& given) {
         throw failure(Msg::stdinRefuses, {"--post with %i"});
 }
 
+void takeSplit(Given& given) {
+    if (given.split.empty()) return;
+    if (given.job.standardInput) throw failure(Msg::stdinRefuses, {"--split"});
+    given.job.division = makeSplit(given.split);
+}
+
 }  // namespace
 
 void resolveJob(GivenJob& given) {
@@ -147,6 +154,7 @@ void transcode(Given& given, Signals& signals) {
     job.policy.quiet = job.quiet;
     takeStandardInput(given);
     resolveJob(given);
+    takeSplit(given);
     runJob(given.job, [&] { return std::make_unique<Job>(given.job, signals); });
 }
 
@@ -237,6 +245,7 @@ void addTranscode(CommandLine& line, Signals& signals, const std::string& versio
     given->progress.add(command);
     command.flag("--strict", job.strict, "Let the job fail if there is a warning");
     command.flag("--unchanged", job.unchanged, "Let the job fail if an INPUT changes while it is read");
+    command.option("--split", given->split, "Make the picture in N parts, side by side", "N");
     addThreads(command, given->threads);
     command.flag("--dry-run", job.dryRun, "Print the plan and do nothing");
     given->outputs.add(command);

@@ -6,8 +6,11 @@
 #include <filesystem>
 #include <new>
 
+#include <fcntl.h>
 #include <glob.h>
+#include <unistd.h>
 
+#include "tarsel/host/descriptor.h"
 #include "tarsel/words/messages.h"
 #include "tarsel/words/systemcause.h"
 
@@ -191,4 +194,27 @@ void requireFolder(const std::string& folder, const std::string& output) {
 void removeFile(const std::string& name) {
     std::error_code error;
     fs::remove(name, error);
+}
+
+void makeFolder(const std::string& name) {
+    std::error_code error;
+    fs::create_directory(name, error);
+    if (error) throw failureOf(fs::filesystem_error("", name, error));
+}
+
+void makeHole(const std::string& name, long long bytes) {
+    const Descriptor file(open(name.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0600));
+    if (!file || ftruncate(file.get(), bytes) != 0)
+        throw failureOf(fs::filesystem_error("", name, std::error_code(errno, std::generic_category())));
+}
+
+void moveFile(const std::string& name, const std::string& to) {
+    std::error_code error;
+    fs::rename(name, to, error);
+    if (error) throw failureOf(fs::filesystem_error("", to, error));
+}
+
+void removeTree(const std::string& name) {
+    std::error_code error;
+    fs::remove_all(name, error);
 }

@@ -29,6 +29,15 @@ std::string firstBytes(const std::string& name, size_t most);
 // So many bytes of a file from a place on, fewer where it ends before. Throws Failure (input).
 std::string bytesAt(const std::string& name, long long from, size_t most);
 
+// A folder in one that is there. Throws Failure (output).
+void makeFolder(const std::string& name);
+// A file of so many bytes 0 that takes no room on the disk. Throws Failure (output).
+void makeHole(const std::string& name, long long bytes);
+// A file gets another name on the same file system, in place of what has it. Throws Failure (output).
+void moveFile(const std::string& name, const std::string& to);
+// A folder and all in it, as far as this process may.
+void removeTree(const std::string& name);
+
 // Throws Failure (output) if the name of an output is that of a folder, with the name of a file in it as a
 // hint.
 void requireNoFolder(const std::string& name, const std::string& extension);

@@ -100,6 +100,11 @@ Job::Job(const JobOptions& options, std::unique_ptr<StoredTask> task, Signals& s
 
 void Job::begin(JobPlan plan) {
     parts_.plan = std::move(plan);
+    if (options_.division) {
+        if (parts_.stored && parts_.stored->isJoin())
+            throw failure(Msg::splitJoin, {parts_.plan.output.name});
+        options_.division->plan(parts_.plan);
+    }
     const bool joins = parts_.stored && parts_.stored->isJoin();
     lengths_ = InputLengths(parts_.sources, joins ? parts_.stored->inputs() : std::vector<std::string>());
     warnings_.add(parts_.plan.warnings);
@@ -243,7 +248,8 @@ void Job::printPlan() {
         saveTask(parts_, options_, signals_);
         parts_.outputs.commitTask();
     }
-    printText((parts_.stored ? segmentsText(*parts_.stored) : "") + planText(parts_.plan));
+    printText((parts_.stored ? segmentsText(*parts_.stored) : "") + planText(parts_.plan) +
+              (options_.division ? options_.division->text() : ""));
     if (!options_.quiet) warnings_.show();
     if (!options_.quiet)
         for (const auto& line : parts_.plan.notes) tell(Level::note, line);

@@ -10,6 +10,11 @@
 #include "tarsel/job/plan/planoptions.h"
 #include "tarsel/job/progress.h"
 
+struct JobParts;
+struct JobPlan;
+class JobDivision;
+class Warnings;
+
 struct JobOptions : PlanOptions {
     std::string raw;                               // format of a raw input
     bool noRotate = false;                         // films stay as they are coded
@@ -17,12 +22,38 @@ struct JobOptions : PlanOptions {
     std::string post;                              // command that is run afterwards
     ProgressMode progress;
     OutputPolicy policy{false};
-    std::string presetName;  // a preset's name or symbol
-    int threads = 0;         // the most of each decoder and encoder; 0 for their own choice
+    std::string presetName;                 // a preset's name or symbol
+    std::shared_ptr<JobDivision> division;  // null for a job in one piece
+    int threads = 0;                        // the most of each decoder and encoder; 0 for their own choice
     bool dryRun = false, quiet = false;
     bool relative = false;              // the task file has names that count from its folder
     bool unchanged = false;             // inputs that change meanwhile are failures
     bool strict = false;                // warnings are failures
     std::vector<std::string> warnings;  // of earlier attempts
     double measuredFor = -1;            // seconds that a pass over the sound took before; negative for none
+};
+
+// How a job is carried out in parts that are put together afterwards.
+class JobDivision {
+  public:
+    struct Given {
+        const JobOptions& options;
+        const JobParts& parts;
+        AnyDict task;        // the job as a task
+        std::string output;  // the name in the hidden folder that the multiplexer would write to
+        Progress& progress;
+        Warnings& warnings;
+    };
+
+    virtual ~JobDivision() = default;
+    // Before any work. Throws Failure for a job that can't be divided.
+    virtual void plan(const JobPlan& plan) = 0;
+    // What --dry-run prints of it: lines.
+    virtual std::string text() const = 0;
+    // Frames or samples of each stream of the plan; nothing when it was stopped. Throws Failure.
+    virtual std::vector<long long> run(const Given& given) = 0;
+    // From any thread.
+    virtual void requestStop() = 0;
+    virtual void pause(bool paused) = 0;
+    virtual ProgressState now() const = 0;
 };

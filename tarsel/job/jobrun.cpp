@@ -55,7 +55,10 @@ void JobRun::run() {
                                             .file = plan_.output.name});
     checkSpace();
     saveTask(parts_, options_, signals_);
-    transcode(beginFilters());
+    if (options_.division)
+        divide();
+    else
+        transcode(beginFilters());
     const std::vector<std::string> names = parts_.outputs.names();
     Events::get().wrote(names);
     if (options_.post.empty()) signals_.complete();
@@ -77,7 +80,8 @@ void JobRun::run() {
 
 void JobRun::checkSpace() const {
     const long long space = parts_.outputs.freeSpace();
-    const long long need = plan_.output.kind == OutputKind::pictures ? 0 : plan_.bytes();
+    const long long whole = plan_.output.kind == OutputKind::pictures ? 0 : plan_.bytes();
+    const long long need = options_.division ? 2 * whole : whole;  // of the parts, and of what they become
     if (space >= 0 && need > space)
         throw failure(Msg::outputNoSpace, {plan_.output.name, formatBytes(need), formatBytes(space)});
 }
@@ -114,6 +118,46 @@ void JobRun::transcode(const std::vector<ProcessParams>& params) {
         lengths_.check(!plan_.output.isStream());
         throwBetter(memory.ranOut(), plan_.output.name);
     }
+    checkAndCommit();
+}
+
+// The parts are runs of their own; here they are waited for and put together.
+void JobRun::divide() {
+    JobDivision& division = *options_.division;
+    const Signals::Watch running(signals_, {.first = [&](int) { division.requestStop(); },
+                                            .second = [this] { return parts_.outputs.leave(); },
+                                            .report = [&] { progress_.report(division.now()); },
+                                            .suspend =
+                                                [&] {
+                                                    progress_.time().stopping();
+                                                    division.pause(true);
+                                                },
+                                            .resume =
+                                                [&] {
+                                                    division.pause(false);
+                                                    progress_.time().continued();
+                                                },
+                                            .file = plan_.output.name});
+    AnyDict task = storedState(parts_, options_);
+    const std::string output = parts_.outputs.begin();
+    progress_.start(division.now());
+    {
+        bool paused = false;
+        Keyboard keyboard(progress_.onTerminal(), [&](char key) {
+            if (key == 'q') Signals::interrupt();
+            if (key == '?') progress_.say(kKeyHelp);
+            if (key != 'p') return;
+            paused = !paused;
+            paused ? progress_.time().pause() : progress_.time().resume();
+            division.pause(paused);
+            progress_.show(division.now());
+        });
+        written_ = division.run({options_, parts_, std::move(task), output, progress_, warnings_});
+    }
+    ProgressState end = division.now();
+    end.state = written_.empty() ? "stopped" : "done";
+    progress_.finish(end);
+    stopIfSignalled();
     checkAndCommit();
 }
 

@@ -23,6 +23,7 @@ class JobRun {
     void checkSpace() const;
     std::vector<ProcessParams> beginFilters();
     void transcode(const std::vector<ProcessParams>& params);
+    void divide();
     void drive(JobTranscoder& transcoder);
     void boundThreads() const;
     int start(JobTranscoder& transcoder);

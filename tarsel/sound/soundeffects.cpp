@@ -86,10 +86,16 @@ MediaTime parseDelay(const std::string& text, const std::optional<QvFramerate>& 
     return earlier ? MediaTime() - time : time;
 }
 
+// As it is when a task has been stored and read again, so that a job and its task give the same sound.
+static double asStored(double value) {
+    constexpr double places = 1e6;
+    return std::round(value * places) / places;
+}
+
 AnyDict volumeState(double decibels) {
     const auto filter = filterNamed("avol");
     setChecked(*filter, "precision", kFineGain, "--volume");
-    setChecked(*filter, "volume", decibels, "--volume");
+    setChecked(*filter, "volume", asStored(decibels), "--volume");
     return stateOf(*filter);
 }
 
@@ -119,7 +125,7 @@ AnyDict soundFadeState(const SoundFade& fade, int channels) {
     constexpr double whole = 100;  // percent
     AnyVector points;
     const auto add = [&](double time, double level) {
-        points.append(Any(AnyDict("time", time, "volume", static_cast<int>(std::lround(level)))));
+        points.append(Any(AnyDict("time", asStored(time), "volume", static_cast<int>(std::lround(level)))));
     };
     const double both = fade.in + fade.out;
     const bool meet = both > fade.length;

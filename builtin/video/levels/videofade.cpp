@@ -13,11 +13,19 @@ namespace {
 using Settings = VideoFadeSettings;
 
 constexpr uint32_t whole = 65536;
+constexpr char firstKey[] = "first_frame";
 
 constexpr QvParamRow<Settings> rows[] = {
     {"fade_in", &Settings::in, qvParamStored, 0, INT_MAX, "Frames count to fade in", "frames"},
     {"fade_out", &Settings::out, qvParamStored, 0, INT_MAX, "Frames count to fade out", "frames"},
     {"frames_count", &Settings::count, qvParamStored, 0, INT_MAX, "Total frames count in segment", "frames"},
+    {.name = firstKey,
+     .member = &Settings::first,
+     .flags = qvParamStored,
+     .min = 0,
+     .max = INT_MAX,
+     .unit = "frames",
+     .help = "of the segment: the number of the frame that comes first"},
 };
 static_assert(qvParamTableOk<Settings>(rows));
 
@@ -39,12 +47,20 @@ int CVideoFade::setParam(const char* name, const Any& value) {
     return InPlaceEffectOf::setParam(name, value);
 }
 
+void CVideoFade::store(AnyDict& dict) const {
+    InPlaceEffectOf::store(dict);
+    if (settings_.first > 0 || !dict.get("state").isDict()) return;
+    AnyDict state = dict.get("state").asDict();
+    state.remove(firstKey);
+    dict.set("state", state);
+}
+
 int CVideoFade::length() const { return settings_.count > 0 ? settings_.count : announced_; }
 
 int CVideoFade::open() {
     qv_dbg()->info("Opening CVideoFade filter, in=%d, out=%d, count=%d", settings_.in, settings_.out,
                    settings_.count);
-    position_ = 0;
+    position_ = settings_.first;
     return InPlaceEffectOf::open();
 }
 
@@ -56,7 +72,7 @@ uint32_t CVideoFade::share(int frame) const {
 }
 
 int CVideoFade::change(const QvFrame& from, QvFrame& to) {
-    if (position_ == 0 && settings_.out > 0 && length() <= 0)
+    if (position_ == settings_.first && settings_.out > 0 && length() <= 0)
         qv_log()->warning("The fade out is left out: 'frames_count' says how many frames there are");
     const uint32_t kept = share(position_);
     if (position_ < INT_MAX) ++position_;

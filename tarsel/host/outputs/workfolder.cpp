@@ -18,9 +18,23 @@
 
 namespace {
 
-// Removes the plain files and links of a folder; how many entries went. Those that a manifest or the owner
-// stands in are not counted as files.
-int removeOnce(int folder, WorkFolder::Removed& removed) {
+constexpr int kMostDepth = 4;  // of folders below that of the parts
+
+int removeOnce(int folder, WorkFolder::Removed& removed, int depth = 0);
+
+// A folder of parts, with what is in it; whether anything went.
+bool removeParts(int place, const char* name, WorkFolder::Removed& removed, int depth) {
+    if (depth > kMostDepth) return false;
+    const Descriptor folder(openat(place, name, O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
+    if (!folder) return false;
+    bool some = false;
+    while (removeOnce(folder.get(), removed, depth) > 0) some = true;
+    return unlinkat(place, name, AT_REMOVEDIR) == 0 || some;
+}
+
+// Removes the plain files and links of a folder, and the folder of parts; how many entries went. Those that a
+// manifest or the owner stands in are not counted as files. `depth`: 0 for the work folder itself.
+int removeOnce(int folder, WorkFolder::Removed& removed, int depth) {
     int count = 0;
     alignas(dirent64) char entries[4096];
     lseek(folder, 0, SEEK_SET);
@@ -28,12 +42,17 @@ int removeOnce(int folder, WorkFolder::Removed& removed) {
         for (ssize_t at = 0; at < size;) {
             const auto* entry = reinterpret_cast<const dirent64*>(entries + at);
             at += entry->d_reclen;
-            if (std::strcmp(entry->d_name, WorkFolder::kOwner) == 0) continue;
+            const std::string_view name = entry->d_name;
+            if (name == "." || name == ".." || (depth == 0 && name == WorkFolder::kOwner)) continue;
             struct stat status;
             const bool known = fstatat(folder, entry->d_name, &status, AT_SYMLINK_NOFOLLOW) == 0;
-            if (unlinkat(folder, entry->d_name, 0) != 0) continue;  // fails for "." and ".."
+            if (unlinkat(folder, entry->d_name, 0) != 0) {
+                const bool parts = depth > 0 || name == WorkFolder::kParts;
+                if (parts && removeParts(folder, entry->d_name, removed, depth + 1)) ++count;
+                continue;
+            }
             ++count;
-            if (!known || std::strcmp(entry->d_name, Manifest::kDraft) == 0) continue;
+            if (!known || name == Manifest::kDraft) continue;
             ++removed.files;
             removed.bytes += status.st_size;
         }

@@ -5,6 +5,7 @@
 //     .tarsel-Xq3b0Z/out#0.png ...   what the job writes
 //     .tarsel-Xq3b0Z/old-0 ...       what stood under its names before
 //     .tarsel-Xq3b0Z/moving-old-in   while files are moved: see manifest.h
+//     .tarsel-Xq3b0Z/parts/          of a job that is made in parts: what they write
 #pragma once
 
 #include <string>
@@ -16,6 +17,7 @@ class WorkFolder {
   public:
     static constexpr std::string_view kPrefix = ".tarsel-";
     static constexpr const char* kOwner = "owner";
+    static constexpr const char* kParts = "parts";
 
     struct Removed {
         size_t files = 0;  // of the job, and what it replaced

@@ -13,13 +13,6 @@ constexpr std::string_view kDivisible[] = {"aquant",  "avol",        "bobber",  
                                            "cropper", "deinterlace", "flipper", "frconvert",  "logo",
                                            "scaler",  "srconvert",   "userdata"};
 
-// A module of a plug-in says so by its attribute.
-bool isDivisible(const std::string& name) {
-    if (std::find(std::begin(kDivisible), std::end(kDivisible), name) != std::end(kDivisible)) return true;
-    const QvModule* const module = qv_registry()->module(name.c_str());
-    return module && module->getAttr("divisible").isTrue();
-}
-
 // The clock of the texts begins at the start of the output.
 void moveSubtitles(QvCodec& filter, const SegmentPlace& place) {
     if (place.ofCuts) return;
@@ -37,6 +30,12 @@ void moveTimecode(QvCodec& filter, const SegmentPlace& place) {
 }
 
 }  // namespace
+
+bool isDivisible(const std::string& filter) {
+    if (std::find(std::begin(kDivisible), std::end(kDivisible), filter) != std::end(kDivisible)) return true;
+    const QvModule* const module = qv_registry()->module(filter.c_str());
+    return module && module->getAttr("divisible").isTrue();
+}
 
 void requireDivisible(const std::string& filter) {
     if (!isDivisible(filter)) throw failure(Msg::filterNotDivided, {filter});

@@ -5,8 +5,10 @@
 
 #include <qvplugcore/qvplugcore.h>
 
-// Throws Failure for a filter of --filter that does not work on each frame or sample by itself: it would
-// begin anew in each segment. A module of a plug-in says that it does by the attribute "divisible".
+// Whether its result depends on one frame or sample and nothing else. A module of a plug-in says so by the
+// attribute "divisible".
+bool isDivisible(const std::string& filter);
+// Throws Failure for a filter of --filter that is not: it would begin anew in each segment.
 void requireDivisible(const std::string& filter);
 
 struct SegmentPlace {

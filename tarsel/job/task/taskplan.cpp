@@ -56,7 +56,8 @@ void readPoints(const ProcessParams& params, const MediaTime& length, PlannedStr
     part.whole = false;
     part.in = points->inPoint();
     const MediaTime out = points->outPoint();
-    if (out > MediaTime() && out < length) part.out = out;
+    const bool held = stream.isVideo() && params.holdLast();
+    if (out > MediaTime() && (out < length || held)) part.out = out;
     if (out > length && !stream.isVideo()) stream.delayed = out - length;
 }
 

@@ -1,4 +1,4 @@
-#include "tarsel/batch/childtask.h"
+#include "tarsel/split/childtask.h"
 
 #include "tarsel/words/failure.h"
 #include "tarsel/words/json.h"

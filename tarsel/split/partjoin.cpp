@@ -1,0 +1,116 @@
+#include "tarsel/split/partjoin.h"
+
+#include <algorithm>
+#include <filesystem>
+#include <span>
+
+#include "tarsel/host/files.h"
+#include "tarsel/words/messages.h"
+
+namespace fs = std::filesystem;
+
+namespace {
+
+// Where the samples of a WAV file begin.
+long long samplesAt(const std::string& file) {
+    constexpr size_t kForm = 12, kHead = 8, kMost = 1 << 16;  // bytes: "RIFF....WAVE", id and size, looked at
+    const std::string bytes = firstBytes(file, kMost);
+    for (size_t at = kForm; at + kHead <= bytes.size();) {
+        if (bytes.compare(at, 4, "data") == 0) return static_cast<long long>(at + kHead);
+        size_t size = 0;
+        for (size_t i = 0; i < 4; ++i)
+            size |= static_cast<size_t>(static_cast<unsigned char>(bytes[at + 4 + i])) << 8 * i;
+        at += kHead + size + size % 2;
+    }
+    throw failure(Msg::outputUnreadable, {file});
+}
+
+void takeFormat(QvFileMuxStream& to, const QvEncoder& encoder) {
+    const auto ask = [&](const char* name) { return static_cast<const QvCodec&>(encoder).getParam(name); };
+    if (to.type == qvVideoStream) {
+        if (const Any rate = ask("framerate"); rate.isFramerate()) to.framerate = rate.asFramerate();
+        for (const char* name : {"type", "width", "height"}) to.params.set(name, ask(name));
+    } else {
+        to.samplerate = ask("samplerate").asInt32(0);
+        to.channels = ask("channels").asInt32(0);
+        to.bitsPerSample = ask("bitsPerSample").asInt32(0);
+    }
+}
+
+// Each into the folder of the output, by its own name.
+void moveHere(std::span<const std::string> files, const std::string& output) {
+    const fs::path folder = fs::path(output).parent_path();
+    for (const std::string& file : files) moveFile(file, (folder / fs::path(file).filename()).string());
+}
+
+class Multiplexed {
+  public:
+    Multiplexed(const JobParts& parts, const PartFiles& files) : parts_(parts), files_(files) {}
+
+    bool write(const std::string& output, bool withSound, const std::function<bool(double)>& watch) {
+        size_t sound = 0;
+        for (const PlannedStream& stream : parts_.plan.streams) {
+            if (!stream.isVideo() && !withSound) continue;
+            std::vector<QvFilePart> data;
+            if (stream.isVideo())
+                for (const PartPictures& part : files_.pictures)
+                    data.push_back({Any(part.files.at(0).c_str()), stream.bytes(part.lead)});
+            else
+                data.push_back(samplesOf(stream, files_.sounds.at(sound++)));
+            add(stream, std::move(data));
+        }
+        mux_.config().watch = watch;
+        settings();
+        const int result = mux_.run(parts_.plan.output.muxer(), Any(output.c_str()));
+        if (result == QvFileMux::cancelled) return false;
+        if (result != 0)
+            throw writeFailure(parts_.plan.output.name, parts_.outputs.withFinalNames(mux_.errorDesc()));
+        return true;
+    }
+
+  private:
+    void add(const PlannedStream& stream, std::vector<QvFilePart> data) {
+        const std::string encoder = stream.encoder();
+        QvFileMuxStream& to = mux_.config().addStream(stream.type, data.front().file, Any(encoder.c_str()));
+        takeFormat(to, *parts_.encoder(stream));
+        to.parts = std::move(data);
+        const long long wanted = stream.bytes(stream.expected), found = to.length();
+        if (found != wanted)
+            throw failure(Msg::outputDiffers, {parts_.plan.output.name, std::to_string(found),
+                                               "bytes of its parts", std::to_string(wanted)});
+    }
+
+    QvFilePart samplesOf(const PlannedStream& stream, const std::string& file) const {
+        return {Any(file.c_str()), samplesAt(file), stream.bytes(stream.expected)};
+    }
+
+    void settings() {
+        AnyDict state;
+        parts_.pipe->getMuxer()->store(state);
+        for (const char* key : {"name", "displayName", "filename"}) state.remove(key);
+        mux_.config().output = state;
+    }
+
+    const JobParts& parts_;
+    const PartFiles& files_;
+    QvFileMux mux_;
+};
+
+}  // namespace
+
+bool joinParts(const JobParts& parts, const PartFiles& files, const std::string& output,
+               const std::function<bool(double)>& watch) {
+    switch (parts.plan.output.kind) {
+        case OutputKind::pictures:
+            for (const PartPictures& part : files.pictures)
+                moveHere(std::span(part.files)
+                             .subspan(std::min<size_t>(static_cast<size_t>(part.lead), part.files.size())),
+                         output);
+            moveHere(files.sounds, output);
+            return true;
+        case OutputKind::raw:
+            moveHere(files.sounds, output);
+            return Multiplexed(parts, files).write(output, false, watch);
+        default: return Multiplexed(parts, files).write(output, true, watch);
+    }
+}

@@ -1,0 +1,211 @@
+#include "tarsel/split/split.h"
+
+#include <algorithm>
+#include <atomic>
+#include <filesystem>
+#include <mutex>
+#include <thread>
+
+#include "tarsel/host/files.h"
+#include "tarsel/host/outputs/workfolder.h"
+#include "tarsel/job/progress.h"
+#include "tarsel/job/task/storedtask.h"
+#include "tarsel/job/warnings.h"
+#include "tarsel/split/localparts.h"
+#include "tarsel/split/partjoin.h"
+#include "tarsel/split/parttask.h"
+#include "tarsel/words/messages.h"
+#include "tarsel/words/timespec.h"
+
+namespace fs = std::filesystem;
+
+namespace {
+
+constexpr int kMostParts = 10000;
+constexpr double kSoundWeight = 0.03;  // of the sound, as a share of the picture's
+constexpr double kJoinWeight = 0.05;   // of putting the parts together, as a share of all
+
+class Split : public JobDivision {
+  public:
+    explicit Split(int parts) : wanted_(parts) {}
+
+    void plan(const JobPlan& plan) override;
+    std::string text() const override;
+    std::vector<long long> run(const Given& given) override;
+    void requestStop() override;
+    void pause(bool paused) override;
+    ProgressState now() const override;
+
+  private:
+    // Ends what still runs, whatever happens.
+    struct Ended {
+        explicit Ended(Split& of) : split(of) {}
+        ~Ended() {
+            const std::lock_guard guard(split.lock_);
+            split.executor_.reset();
+        }
+        Ended(const Ended&) = delete;
+        Ended& operator=(const Ended&) = delete;
+        Split& split;
+    };
+
+    void writeTasks(const Given& given, const fs::path& folder);
+    void show(const Given& given);
+    std::vector<PartState> carryOut(const Given& given);
+    PartFiles filesOf(const std::vector<PartState>& states, const std::string& tiny) const;
+
+    const int wanted_;
+    SplitPlan split_;
+    bool sound_ = false;
+    std::vector<Part> parts_;  // those of the picture, then the sound
+    std::unique_ptr<PartExecutor> executor_;
+    std::mutex lock_;  // of executor_, which signals and keys reach as well
+    std::atomic<bool> stop_{false}, paused_{false};
+    std::atomic<double> done_{0};
+    std::atomic<long long> frames_{0};
+    double rate_ = 25;
+};
+
+void Split::plan(const JobPlan& plan) {
+    if (!plan.hasVideo()) throw failure(Msg::splitNoPicture, {plan.output.name});
+    split_ = planSplit(plan, wanted_);
+    sound_ = plan.count(qvAudioStream) > 0;
+    const auto picture = std::ranges::find_if(plan.streams, &PlannedStream::isVideo);
+    rate_ = static_cast<double>(picture->picture.rate.rate());
+}
+
+std::string Split::text() const {
+    std::string text;
+    for (size_t part = 0; part < split_.parts(); ++part)
+        text += "part    " + std::to_string(part + 1) + ": frames " + std::to_string(split_.first(part)) +
+                " to " + std::to_string(split_.points[part + 1] - 1) + "\n";
+    if (sound_) text += "part    " + std::to_string(split_.parts() + 1) + ": the sound\n";
+    return text;
+}
+
+void Split::writeTasks(const Given& given, const fs::path& folder) {
+    const JobPlan& plan = given.parts.plan;
+    const std::string stem = fs::path(given.output).stem().string();
+    const auto outputOf = [&](const std::string& name, const char* extension) {
+        makeFolder((folder / name).string());
+        return (folder / name / stem).string() + extension;
+    };
+    const auto add = [&](const std::string& name, double weight, const AnyDict& task) {
+        const std::string file = (folder / (name + ".xml")).string(), reason = writeTask(task, file);
+        if (!reason.empty()) throw writeFailure(plan.output.name, given.parts.outputs.withFinalNames(reason));
+        parts_.push_back({file, weight});
+    };
+    parts_.clear();
+    const char* const extension = plan.output.kind == OutputKind::pictures ? ".png" : ".raw";
+    for (size_t part = 0; part < split_.parts(); ++part) {
+        const std::string name = std::to_string(part + 1), output = outputOf(name, extension);
+        add(name, static_cast<double>(split_.frames(part)),
+            pictureTask(given.task, plan, split_, part, output));
+    }
+    if (!sound_) return;
+    const std::string tiny = (folder / "tiny.i420").string();
+    makeHole(tiny, tinyBytes(plan));
+    add("sound", static_cast<double>(split_.points.back()) * kSoundWeight,
+        soundTask(given.task, plan, tiny, outputOf("sound", ".raw")));
+}
+
+void Split::show(const Given& given) {
+    double whole = 0, done = 0;
+    long long frames = 0;
+    for (size_t i = 0; i < parts_.size(); ++i) {
+        const PartState& state = executor_->states()[i];
+        whole += parts_[i].weight;
+        done += parts_[i].weight * (state.ended ? 1 : state.done);
+        if (i < split_.parts()) frames += state.frames;
+    }
+    done_ = done / whole * (1 - kJoinWeight);
+    frames_ = frames;
+    if (given.progress.due()) given.progress.update(now());
+}
+
+// What each part has become; nothing when they were stopped.
+std::vector<PartState> Split::carryOut(const Given& given) {
+    const int cores = std::max(static_cast<int>(std::thread::hardware_concurrency()), 1);
+    const int atOnce = std::min<int>(cores, static_cast<int>(parts_.size()));
+    const int threads = given.options.threads > 0 ? given.options.threads : std::max(cores / atOnce, 1);
+    std::vector<std::string> words = {"--no-sync", "--threads", std::to_string(threads)};
+    if (given.options.acceptPartial) words.emplace_back("--accept-partial");
+    {
+        const std::lock_guard guard(lock_);
+        executor_ = std::make_unique<LocalParts>(atOnce, words, given.parts.plan.output.name);
+    }
+    const Ended ending(*this);
+    executor_->begin(parts_);
+    if (paused_) executor_->pause(true);
+    if (stop_) executor_->cancel();
+    while (executor_->wait()) show(given);
+    std::vector<PartState> states = executor_->states();
+    if (stop_) return {};
+    for (const PartState& state : states)
+        if (!state.failure.empty())
+            throw Failure(static_cast<Exit>(state.status), given.parts.outputs.withFinalNames(state.failure));
+    return states;
+}
+
+// Beside the sounds there is the picture that only counts.
+PartFiles Split::filesOf(const std::vector<PartState>& states, const std::string& tiny) const {
+    PartFiles files;
+    for (size_t part = 0; part < split_.parts(); ++part) {
+        files.pictures.push_back({states[part].outputs, split_.lead(part)});
+        auto& names = files.pictures.back().files;
+        std::sort(names.begin(), names.end());
+    }
+    if (sound_) files.sounds = states.back().outputs;
+    std::erase(files.sounds, tiny);
+    std::sort(files.sounds.begin(), files.sounds.end());
+    return files;
+}
+
+std::vector<long long> Split::run(const Given& given) {
+    const fs::path folder = fs::path(absoluteName(given.output)).parent_path() / WorkFolder::kParts;
+    makeFolder(folder.string());
+    writeTasks(given, folder);
+    std::vector<long long> written;
+    const std::vector<PartState> states = carryOut(given);
+    if (states.empty()) return written;
+    for (const PartState& state : states)
+        for (const std::string& warning : state.warnings)
+            given.warnings.add(given.parts.outputs.withFinalNames(warning));
+    const std::string tiny = (folder / "sound" / fs::path(given.output).stem()).string() + ".raw";
+    const bool joined = joinParts(given.parts, filesOf(states, tiny), given.output, [&](double part) {
+        done_ = 1 - kJoinWeight + kJoinWeight * part;
+        if (given.progress.due()) given.progress.update(now());
+        return !stop_;
+    });
+    if (!joined) return written;
+    removeTree(folder.string());
+    for (const PlannedStream& stream : given.parts.plan.streams) written.push_back(stream.expected);
+    return written;
+}
+
+void Split::requestStop() {
+    stop_ = true;
+    const std::lock_guard guard(lock_);
+    if (executor_) executor_->cancel();
+}
+
+void Split::pause(bool paused) {
+    paused_ = paused;
+    const std::lock_guard guard(lock_);
+    if (executor_) executor_->pause(paused);
+}
+
+ProgressState Split::now() const {
+    ProgressState state;
+    state.part = done_;
+    state.frame = frames_;
+    state.outSeconds = static_cast<double>(frames_) / rate_;
+    state.state = paused_ ? "paused" : "running";
+    return state;
+}
+
+}  // namespace
+
+std::shared_ptr<JobDivision> makeSplit(const std::string& parts) {
+    return std::make_shared<Split>(static_cast<int>(parseNumber(parts, 2, kMostParts, "--split")));
+}

@@ -1,0 +1,99 @@
+#include "tarsel/split/splitplan.h"
+
+#include <algorithm>
+#include <numeric>
+#include <string_view>
+
+#include "tarsel/job/task/divide.h"
+#include "tarsel/words/messages.h"
+
+namespace {
+
+constexpr long long mostUnit = 1'000'000'000;  // frames; no job is as long
+
+// The smallest count of which `num / den` times as many are whole.
+long long wholeAt(long long num, long long den) { return den / std::gcd(num, den); }
+
+long long common(long long a, long long b) {
+    const long long factor = b / std::gcd(a, b);
+    return a > mostUnit / factor ? mostUnit : a * factor;
+}
+
+// Modules that are told where a part begins.
+bool takesPlace(std::string_view filter) {
+    return filter == "subtitle" || filter == "timecode" || filter == "videofade";
+}
+
+void requireWholeFilters(const JobPlan& plan, const PlannedStream& picture) {
+    if (!plan.filterFiles.written.empty())
+        throw failure(Msg::splitFilter, {plan.filterFiles.written.front().filter});
+    for (const Any& name : picture.filters.names(true))
+        if (const std::string filter = name.asString(""); !takesPlace(filter) && !isDivisible(filter))
+            throw failure(Msg::splitFilter, {filter});
+}
+
+void requireKind(const JobPlan& plan) {
+    const OutputForm& output = plan.output;
+    const bool kind = output.kind == OutputKind::raw || output.kind == OutputKind::pictures ||
+                      output.kind == OutputKind::avi;
+    if (!output.isFiles() || !kind) throw failure(Msg::splitOutput, {output.name});
+    if (plan.count(qvVideoStream) != 1) throw failure(Msg::splitPictures, {output.name});
+}
+
+// Frames of the output in front of the last one that an input gives; those that are held come after it.
+long long ownFrames(const JobPlan& plan, const PlannedStream& picture) {
+    const QvFramerate& rate = plan.source(picture).picture.rate;
+    QvFrameRange range(picture.part.in, std::min(picture.part.out, plan.source(picture).end()), rate);
+    if (!range.empty()) range.convert(rate, picture.picture.rate);
+    return std::min<long long>(range.out, picture.expected);
+}
+
+// Frames of the input.
+long long prerollOf(const PlannedStream& picture) {
+    long long frames = 0;
+    for (const Any& name : picture.filters.names(true))
+        if (const QvModule* const module = qv_registry()->module(name.asString("")))
+            frames += std::max(module->getAttr("preroll").asInt32(0), 0);
+    return frames;
+}
+
+long long leadOf(const JobPlan& plan, const PlannedStream& picture, long long unit) {
+    const QvRatio out = picture.picture.rate.rate(), in = plan.source(picture).picture.rate.rate();
+    const long long inUnit =
+        unit * in.num * out.den / (static_cast<long long>(in.den) * out.num);  // frames of the input, whole
+    const long long preroll = prerollOf(picture);
+    return (preroll + inUnit - 1) / inUnit * unit;
+}
+
+}  // namespace
+
+const PlannedStream& pictureOf(const JobPlan& plan) {
+    return *std::ranges::find_if(plan.streams, &PlannedStream::isVideo);
+}
+
+long long splitUnit(const JobPlan& plan) {
+    const PlannedStream& picture = pictureOf(plan);
+    const QvRatio out = picture.picture.rate.rate(), in = plan.source(picture).picture.rate.rate();
+    long long unit =
+        wholeAt(static_cast<long long>(in.num) * out.den, static_cast<long long>(in.den) * out.num);
+    for (const PlannedStream& stream : plan.streams)
+        if (!stream.isVideo())
+            unit = common(unit, wholeAt(static_cast<long long>(stream.sound.samplerate) * out.den, out.num));
+    return unit;
+}
+
+SplitPlan planSplit(const JobPlan& plan, int parts) {
+    requireKind(plan);
+    const PlannedStream& picture = pictureOf(plan);
+    requireWholeFilters(plan, picture);
+    const long long unit = splitUnit(plan), own = ownFrames(plan, picture);
+    SplitPlan split;
+    split.points = {0};
+    for (int part = 1; part < parts; ++part) {
+        const long long wanted = (own * part / parts + unit / 2) / unit * unit;
+        if (wanted > split.points.back() && wanted < own) split.points.push_back(wanted);
+    }
+    split.points.push_back(picture.expected);
+    split.leadIn = leadOf(plan, picture, unit);
+    return split;
+}
