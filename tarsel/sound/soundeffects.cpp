@@ -24,6 +24,12 @@ std::unique_ptr<QvCodec> filterNamed(const char* module) {
     return makeAnyCodec(module, QvModuleType::audioFilter);
 }
 
+// As it is when a task has been stored and read again, so that a job and its task give the same sound.
+double asStored(double value) {
+    constexpr double places = 1e6;
+    return std::round(value * places) / places;
+}
+
 }  // namespace
 
 double Volumes::of(int sound) const {
@@ -84,12 +90,6 @@ MediaTime parseDelay(const std::string& text, const std::optional<QvFramerate>& 
     const MediaTime time = parseTime(earlier ? text.substr(1) : text, rate, "--delay");
     if (time.seconds() > kMostDelay) throw failure(Msg::delayLong, {text});
     return earlier ? MediaTime() - time : time;
-}
-
-// As it is when a task has been stored and read again, so that a job and its task give the same sound.
-static double asStored(double value) {
-    constexpr double places = 1e6;
-    return std::round(value * places) / places;
 }
 
 AnyDict volumeState(double decibels) {
