@@ -69,6 +69,13 @@ int printWarnings() {
     return static_cast<int>(lines.size());
 }
 
+int printConcealed(const Source& source) {
+    const std::string text = source.concealed();
+    if (text.empty()) return 0;
+    tell(Level::warning, lineOf(Msg::filmConcealed, {source.name(), text}));
+    return 1;
+}
+
 std::vector<std::string> moduleNames(int kind) {
     std::vector<std::string> names;
     const AnyVector modules = qv_registry()->modules(kind);

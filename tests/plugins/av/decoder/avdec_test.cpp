@@ -150,10 +150,19 @@ TEST_F(FilmsInTheTool, whosePicturesAreDamagedSayHowMany) {
     std::string bytes = TempFolder::read(film("film.avi", {"-c:v", "mjpeg"}));
     for (std::size_t at = bytes.size() / 2; at < bytes.size() / 2 + 1500; ++at) bytes[at] = 0;
     folder.write("film.avi", bytes);
-    const Outcome o =
-        tarsel({"transcode", "--accept-partial", "film.avi", "-o", "x.avi", "--muxer", "nullmux"});
-    EXPECT_EQ(o.status, 0) << o.err;
-    EXPECT_THAT(o.err, HasSubstr("could not be decoded"));
+    const auto line = [this](const Words& words) {
+        const Outcome o = tarsel(words);
+        EXPECT_EQ(o.status, 0) << o.err;
+        const std::size_t at = o.err.find("'film.avi' is damaged in places: ");
+        return at == std::string::npos ? o.err : o.err.substr(at, o.err.find('\n', at) - at);
+    };
+    const std::string said = line({"transcode", "film.avi", "-o", "x.avi", "--muxer", "nullmux"});
+    EXPECT_THAT(said, HasSubstr("could not be decoded"));
+    EXPECT_EQ(line({"scope", "film.avi"}), said);
+    EXPECT_EQ(line({"compare", "film.avi", "film.avi"}), said);
+    EXPECT_EQ(line({"frame", "film.avi", "--sheet", "10x5", "-o", "x.png"}), said);
+    EXPECT_EQ(tarsel({"frame", "film.avi", "--sheet", "10x5", "--strict", "-y", "-o", "x.png"}).status, 1);
+    EXPECT_EQ(tarsel({"frame", "film.avi", "--strict", "-o", "first.png"}).status, 0);
 }
 
 TEST_F(FilmsInTheTool, bringTheirSound) {
