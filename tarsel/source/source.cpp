@@ -315,12 +315,6 @@ Any openParameters(const std::string& name) {
     return Any();
 }
 
-// Whether the reader of films is the first that is tried.
-bool isFilm(const std::string& name) {
-    const AnyVector readers = qv_registry()->decoders(QvFile::getExt(Any(name.c_str()), true).asString());
-    return !readers.empty() && readers.at(0) == "avdec";
-}
-
 }  // namespace
 
 std::string Source::head(size_t most) const {

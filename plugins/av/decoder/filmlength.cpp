@@ -40,7 +40,8 @@ double FilmLength::seconds(const AVStream& stream) const {
     return 0;
 }
 
-// Seconds from the first packet to the end of the last one.
+// Seconds from the first packet to the end of the last one; from 0 where the first is later, because then some
+// writers count the time before it, too.
 double FilmLength::present() const {
     double first = 0, last = 0;
     bool any = false;
@@ -55,7 +56,7 @@ double FilmLength::present() const {
             any = true;
         }
     }
-    return any ? last - first : 0;
+    return any ? last - std::min(first, 0.0) : 0;
 }
 
 bool FilmLength::endsEarly() const {
