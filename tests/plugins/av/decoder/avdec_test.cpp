@@ -165,6 +165,22 @@ TEST_F(FilmsInTheTool, whosePicturesAreDamagedSayHowMany) {
     EXPECT_EQ(tarsel({"frame", "film.avi", "--strict", "-o", "first.png"}).status, 0);
 }
 
+TEST_F(FilmsInTheTool, whosePicturesAreDamagedSayTheSameWithAnyThreads) {
+    std::string bytes =
+        TempFolder::read(film("film.mp4", {"-c:v", "libx264", "-bf", "2", "-movflags", "+faststart"},
+                              "testsrc2=size=320x240:rate=25:duration=4"));
+    for (std::size_t at = bytes.size() / 4; at < bytes.size(); at += bytes.size() / 20) bytes[at] ^= 0x55;
+    folder.write("film.mp4", bytes);
+    std::string said;
+    for (const char* threads : {"1", "2", "3", "8", "8", "8"}) {
+        const Outcome o = tarsel(
+            {"transcode", "film.mp4", "--threads", threads, "-y", "-o", "x.avi", "--muxer", "nullmux"});
+        EXPECT_THAT(o.err, HasSubstr("could not be decoded"));
+        if (said.empty()) said = o.err;
+        EXPECT_EQ(o.err, said) << threads;
+    }
+}
+
 TEST_F(FilmsInTheTool, bringTheirSound) {
     const std::string file = folder.file("film.mkv");
     ASSERT_EQ(ffmpeg({"-f", "lavfi", "-i", kMoving, "-f", "lavfi", "-i", "sine=frequency=440:duration=2",
