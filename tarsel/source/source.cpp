@@ -457,6 +457,8 @@ std::string Source::damage() const {
             const bool video = type == 1;
             const long long present = video ? open_->nrFrames(i) : open_->nrSamples(i);
             const long long expected = params.getInt64(video ? "framesExpected" : "samplesExpected", present);
+            if (const long long lost = params.getInt64("framesLost", 0); lost > 0)
+                return std::to_string(lost) + " of its pictures are missing";
             // Others lack whole frames.
             if (video && decoderName() == "rawdec" && expected == present + 1)
                 return "it ends in the middle of frame " + std::to_string(expected) + ", after " +

@@ -142,6 +142,7 @@ int AvDec::openFilm() {
         if (!probe) return refuse(reason);
         fileSize_ = probe->size();
         if (!probe->seekable()) return refuse("it has to be sought, and a pipe can't be; put it into a file");
+        extent_ = extentOf(*probe);
     }
     const auto input = MediaInput::open(*bytes_, settings_.container, reason);
     if (!input) return refuse(reason);
@@ -156,7 +157,7 @@ int AvDec::openFilm() {
 // line in the log; `reason` is the first of these.
 void AvDec::addStreams(MediaInput& input, std::string& reason) {
     const AVFormatContext& container = input.context();
-    const FilmLength length(container, *index_, fileSize_);
+    const FilmLength length(container, *index_, fileSize_, extent_);
     FilmZero zero;
     const auto leaveOut = [&](unsigned number, const std::string& why) {
         qv_log()->warning("Stream %u of '%s' is left out: %s", number, filename().toString().asString(""),
@@ -180,6 +181,7 @@ void AvDec::addStreams(MediaInput& input, std::string& reason) {
                                   i, filename().toString().asString(""));
             auto* const added = addStream(std::make_unique<PictureStream>(std::move(reader), &stream));
             const PictureFormat& format = added->reader().format();
+            if (const long long lost = covers ? 0 : length.lost(stream); lost > 0) added->setLost(lost);
             if (!covers && length.isCut(stream))
                 added->setTruncated(length.announced(stream, format.rate.rate().ratio(), format.frames));
         }

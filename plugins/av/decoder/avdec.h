@@ -23,6 +23,8 @@
 //     "variableRate"   Int32   1: "framerate" is the nearest usual rate, frames repeat or skip pictures
 //     "conversion"     String  what the pixel format can't hold, or how the frames are made of the pictures
 //     "concealed"      Int64   pictures so far that were damaged or did not come
+//     "framesLost"     Int64   pictures that are missing between others, where bytes of the file are missing;
+//                              "truncated" is set, too
 //     "codecProfile"   String  of the codec: "High", "Main 10"
 //     "language"       String  where the container has it; so "title"
 //     "codecParams"    Dict    "pid", where the container numbers its streams
@@ -44,6 +46,7 @@
 
 #include "core/decode/basedecodepipe.h"
 #include "core/measure/qvframerate.h"
+#include "plugins/av/source/fileextent.h"
 #include "plugins/av/source/mediainput.h"
 
 class QvByteSource;
@@ -93,6 +96,7 @@ class AvDec : public BaseDecodePipe {
     AnyDict facts_;
     AnyVector inputFiles_;  // of pictures that are files
     long long fileSize_ = -1;
+    FileExtent extent_;
 
     int setAll(const Any& value);
     int refuse(const std::string& reason);

@@ -88,6 +88,12 @@ void PictureStream::setTruncated(long long expected) {
     params.set("framesExpected", Any(expected));
 }
 
+void PictureStream::setLost(long long pictures) {
+    params.set("truncated", 1);
+    params.set("framesLost", Any(pictures));
+    params.set("framesExpected", reader_->format().frames);
+}
+
 SoundStream::SoundStream(std::unique_ptr<SampleReader> reader, const AVStream& stream)
     : reader_(std::move(reader)) {
     const SoundFormat& format = reader_->format();

@@ -29,6 +29,7 @@ class PictureStream : public DPipeVideoStream {
     PictureSource& reader() { return *reader_; }
     // The file was cut, or is damaged. Nothing changes if it has what it announces all the same.
     void setTruncated(long long expected);
+    void setLost(long long pictures);  // between others
 
   private:
     std::unique_ptr<PictureSource> reader_;

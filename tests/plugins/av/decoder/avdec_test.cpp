@@ -128,6 +128,7 @@ TEST_F(FilmsInTheTool, whoseHeadersStateMoreThanIsThereAreRefused) {
         {"cut.aiff", {}},
         {"cut.au", {}},
         {"cut.caf", {"-c:a", "pcm_s16le"}},
+        {"cut.w64", {"-c:a", "pcm_s16le"}},
         {"cut.mxf",
          {"-f", "lavfi", "-i", "testsrc2=size=96x64:duration=8", "-c:v", "mpeg2video", "-c:a", "pcm_s16le",
           "-ar", "48000"}},
@@ -144,6 +145,32 @@ TEST_F(FilmsInTheTool, whoseHeadersStateMoreThanIsThereAreRefused) {
             tarsel({"transcode", "--accept-partial", c.name, "-y", "-o", "x.avi", "--muxer", "nullmux"});
         EXPECT_EQ(taken.status, 0) << c.name << taken.err;
     }
+}
+
+// 24 pictures are in each cluster, and two of them are lost; or those of the first, the head of which is
+// damaged.
+TEST_F(FilmsInTheTool, thatLackBytesInTheMiddleSayHowManyPictures) {
+    const std::string whole =
+        TempFolder::read(film("film.mkv", {"-c:v", "mpeg4", "-g", "12", "-cluster_time_limit", "960"},
+                              "testsrc2=size=96x64:rate=25:duration=8"));
+    const std::string head = "\x1F\x43\xB6\x75";
+    const std::size_t first = whole.find(head, whole.find(head) + 1);
+    const std::size_t second = whole.find(head, whole.find(head, first + 4) + 4);
+    ASSERT_LT(second, whole.size());
+    std::string zeros = whole;
+    zeros.replace(first, second - first, second - first, '\0');
+    for (const std::string& bytes : {whole.substr(0, first) + whole.substr(second), zeros}) {
+        folder.write("film.mkv", bytes);
+        const Outcome refused = tarsel({"transcode", "film.mkv", "-y", "-o", "x.avi", "--muxer", "nullmux"});
+        EXPECT_EQ(refused.status, 3) << refused.err;
+        EXPECT_THAT(refused.err, HasSubstr("24 of its pictures are missing"));
+        EXPECT_EQ(
+            tarsel({"transcode", "film.mkv", "--accept-partial", "-y", "-o", "x.avi", "--muxer", "nullmux"})
+                .status,
+            0);
+    }
+    folder.write("film.mkv", whole);
+    EXPECT_EQ(tarsel({"transcode", "film.mkv", "-y", "-o", "x.avi", "--muxer", "nullmux"}).status, 0);
 }
 
 TEST_F(FilmsInTheTool, whosePicturesAreDamagedSayHowMany) {
