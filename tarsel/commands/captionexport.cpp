@@ -54,11 +54,12 @@ QvCcCue cueOf(const QvSubtitle& subtitle) {
     return cue;
 }
 
-void readSubtitles(const std::string& file, Captions& captions) {
+void readSubtitles(const std::string& file, const std::string& choice, Captions& captions) {
     requireInput(file);
+    const int stream = subtitleStream(file, choice);
     QvSubtitles read;
     QvSubtitleFindings found;
-    if (read.readFile(Any(file.c_str()), QvFramerate(QvRatio(25, 1)), 0, found) != QvStatus::ok ||
+    if (read.readFile(Any(file.c_str()), QvFramerate(QvRatio(25, 1)), 0, found, stream) != QvStatus::ok ||
         found.problem != QvSubtitleFindings::none)
         throw failure(Msg::inputNoSubtitles, {file});
     if (found.lost > 0)
@@ -135,11 +136,14 @@ std::string CaptionExport::chosen() const {
         for (const auto& [asked, name] : forms)
             if (extension == name) form = name;
     if (form.empty() && named) throw failure(Msg::captionsNoForm, {output});
-    if (form.empty() && isSubtitleFile(files.front())) throw failure(Msg::captionsNotListed, {files.front()});
+    if (form.empty() && isOneFile()) throw failure(Msg::captionsNotListed, {files.front()});
     if (form.empty()) return form;
+    if (!stream.empty() && !isOneFile()) throw failure(Msg::captionsNoStream, {"--stream", files.front()});
     if (files.size() > 1 && form != "json") throw failure(Msg::captionsOneFile, {"--" + form, files[1]});
     return form;
 }
+
+bool CaptionExport::isOneFile() const { return isSubtitleFile(files.front()) || isFilm(files.front()); }
 
 std::optional<QvFramerate> CaptionExport::askedRate() const {
     return rate.empty() ? std::nullopt : std::optional(parseTimecodeRate(rate, "--rate"));
@@ -149,8 +153,8 @@ std::string CaptionExport::text(const std::string& form) const {
     Captions captions;
     const auto asked = askedRate();
     captions.rate = asked.value_or(dropFrame());
-    if (isSubtitleFile(files.front()))
-        readSubtitles(files.front(), captions);
+    if (isOneFile())
+        readSubtitles(files.front(), stream, captions);
     else
         readFields(files, asked, captions);
     return form == "srt"   ? srtText(captions.cues[0])

@@ -11,9 +11,10 @@
 #include "tarsel/host/signals.h"
 
 struct CaptionExport {
-    std::vector<std::string> files;  // one subtitle file, or SCC files of field 1 and field 2
+    std::vector<std::string> files;  // one subtitle file or film, or SCC files of field 1 and field 2
     bool srt = false, vtt = false, scc = false, json = false;
     std::string output;  // "": the standard output; its extension may say the form
+    std::string stream;  // of the subtitles of a film: a number or a language; "": the first
     std::string rate;    // of timecodes; "": what the file suggests, or 29.97df
     OutputOptions outputs;
 
@@ -23,5 +24,6 @@ struct CaptionExport {
     void run(const std::string& form, Signals& signals) const;
 
   private:
+    bool isOneFile() const;
     std::string text(const std::string& form) const;
 };

@@ -84,11 +84,14 @@ void addCaptions(CommandLine& line, Signals& signals) {
         "captions",
         "Show the captions of an SCC file: time, field, bytes, text; or write them in another form");
     auto given = std::make_shared<CaptionExport>();
-    command.arguments("FILE", given->files, "SCC file of field 1, and one of field 2; or a subtitle file", 2);
+    command.arguments("FILE", given->files,
+                      "SCC file of field 1, and one of field 2; or a subtitle file or a film", 2);
     command.flag("--srt", given->srt, "As SubRip, with the times at which captions are on the screen");
     command.flag("--vtt", given->vtt, "As WebVTT");
     command.flag("--scc", given->scc, "As SCC, captions that pop on");
     command.flag("--json", given->json, "As JSON, one object a caption");
+    command.option("--stream", given->stream, "Which subtitles of a film; without it the first",
+                   "N|LANGUAGE");
     command.option("--rate", given->rate, "Frame rate of the timecodes; 29.97df for drop frame", "R");
     command.option("-o,--output", given->output,
                    "What to write, in place of the standard output; its extension may say the form", "FILE");

@@ -60,6 +60,7 @@ class Pictures {
             throw failure(Msg::fileDamaged, {name, damage});
         reader_ = std::make_unique<PictureReader>(source_, effects_);
     }
+    const Source& source() const { return source_; }
     const std::string& name() const { return source_.name(); }
     const std::vector<std::string>& files() const { return source_.files(); }
     const PictureFormat& format() const { return reader_->format(); }
@@ -250,6 +251,8 @@ void compare(Given& given) {
     report(given, first, second, common, all, worst, mean);
     if (saved) saveSheet(first, second, offset, worst, *saved);
     flushOutput();
+    printConcealed(first.source());
+    printConcealed(second.source());
     const double psnr = mean.mean().psnr();
     if (minPsnr >= 0 && psnr < minPsnr)
         throw failure(Msg::comparePsnr, {second.name(), decibels(psnr), given.minPsnr});

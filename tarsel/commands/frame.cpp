@@ -99,7 +99,7 @@ class Reading {
     const Signals::Watch watch_;
 };
 
-void save(const QvFrame& picture, const Given& given) {
+void save(const QvFrame& picture, const Source& source, const Given& given) {
     Outputs* const outputs = given.outputs.get();
     Signals::Handlers handlers;
     if (outputs) handlers.second = [outputs] { return outputs->leave(); };
@@ -112,7 +112,7 @@ void save(const QvFrame& picture, const Given& given) {
         if (errno != 0) throw systemFailure(Msg::outputSystem, given.output, errno);
         throw failure(Msg::outputRefused, {given.output, "the picture can't be converted to a PNG"});
     }
-    const int warnings = given.warnings + printWarnings() + pluginWarnings();
+    const int warnings = given.warnings + printWarnings() + printConcealed(source) + pluginWarnings();
     if (given.strict && warnings > 0)
         throw failure(Msg::warningsCount, {given.output, std::to_string(warnings)});
     if (outputs) outputs->commit();
@@ -142,7 +142,7 @@ void saveSheet(const Source& source, PictureReader& reader, const Given& given) 
                        kGap + i / grid.width * (height + kGap), width, height) != QvStatus::ok)
             throw std::bad_alloc();
     reading.done();
-    save(sheet, given);
+    save(sheet, source, given);
 }
 
 // A cut input is refused unless the user takes what is there, as a run would do it. How many warnings it
@@ -190,7 +190,7 @@ void frame(Given& given) {
     Reading reading(given, source, reader, number);
     const QvFrame& picture = reader.at(number);
     reading.done();
-    save(picture, given);
+    save(picture, source, given);
 }
 
 }  // namespace

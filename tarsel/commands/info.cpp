@@ -193,6 +193,7 @@ std::string streamLine(const Json& s) {
         if (s.contains("pairs")) add(number("pairs") + " pairs");
         if (s.contains("first_s"))
             add(formatTime(s["first_s"].get<double>()) + " to " + formatTime(s["last_s"].get<double>()));
+        if (s.contains("language")) add(oneLine(s["language"]));
         return line;
     } else {
         if (s.contains("samplerate")) add(number("samplerate") + " Hz");

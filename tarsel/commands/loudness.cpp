@@ -139,6 +139,7 @@ void measureFile(const std::string& name, bool json, Json& all) {
     const std::string damage = source.damage();
     if (!damage.empty()) file["damage"] = damage;
     all.push_back(std::move(file));
+    printConcealed(source);
     if (!damage.empty()) throw failure(Msg::fileDamaged, {name, damage});
     printWarnings();
 }

@@ -108,6 +108,7 @@ void scope(Given& given) {
     report(given, levels.histogram, last - first + 1);
     if (saved) saved->save(waveform);
     flushOutput();
+    printConcealed(source);
 }
 
 }  // namespace

@@ -65,10 +65,12 @@ void addEffectOptions(Command& command, EffectOptions& options) {
     command.flag("--flip", options.flip, "Turn the picture upside down");
     command.list("--logo", options.logos, "Draw a picture; -X and -Y count from the right and the bottom",
                  "FILE@X,Y[,OPACITY]");
-    command.option("--subtitles", options.subtitles, "Burn in the subtitles of an .srt or .sub file", "FILE");
-    command.option("--subtitle-style", options.subtitleStyle,
-                   "Keys size, color, font, effect, align, margin, wrap, encoding, delay, speed, rate",
-                   "K=V,...");
+    command.option("--subtitles", options.subtitles,
+                   "Burn in the subtitles of an .srt or .sub file or of a film", "FILE");
+    command.option(
+        "--subtitle-style", options.subtitleStyle,
+        "Keys size, color, font, effect, align, margin, wrap, encoding, delay, speed, rate, stream",
+        "K=V,...");
     command.flagOrValue(
         "--timecode", options.timecode,
         "Burn in the timecode of the input, or from START on; keys start, mode=frames, x, y, size, "

@@ -5,6 +5,7 @@
 #include <cmath>
 
 #include "tarsel/host/files.h"
+#include "tarsel/source/captionfile.h"
 #include "tarsel/source/picturefile.h"
 #include "tarsel/words/keyvalues.h"
 #include "tarsel/words/messages.h"
@@ -236,7 +237,7 @@ SubtitleFacts readSubtitles(const std::string& file, const QvCodec& filter) {
     SubtitleFacts facts;
     QvSubtitles subtitles;
     subtitles.readFile(Any(file.c_str()), QvFramerate(QvRatio(25, 1)), filter.getParam("encoding").toInt32(),
-                       facts.findings);
+                       facts.findings, filter.getParam("subtitle_stream").toInt32());
     facts.readable = subtitles.nrSubtitles();
     return facts;
 }
@@ -342,11 +343,14 @@ AnyDict subtitleState(const std::string& file, const std::string& style, const P
     setChecked(*filter, "wrap", 1, option);
     setChecked(*filter, "align", kBottom, option);
     setMargin(*filter, kTitleSafe, picture, option);
-    const KeyValues keys(
-        style,
-        {"size", "color", "font", "effect", "encoding", "delay", "speed", "rate", "align", "margin", "wrap"},
-        "--subtitle-style");
+    const KeyValues keys(style,
+                         {"size", "color", "font", "effect", "encoding", "delay", "speed", "rate", "align",
+                          "margin", "wrap", "stream"},
+                         "--subtitle-style");
     for (const auto& [key, value] : keys.all()) setStyle(*filter, key, value, picture);
+    const std::string* const stream = keys.find("stream");
+    if (stream || isFilm(file))
+        setChecked(*filter, "subtitle_stream", subtitleStream(file, stream ? *stream : ""), option);
     checkSubtitles(file, *filter, acceptPartial);
     return stateOf(*filter);
 }

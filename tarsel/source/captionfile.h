@@ -14,6 +14,11 @@ QvFramerate readScc(const std::string& name, int field, const std::optional<QvFr
                     QvCcData& data);
 
 bool isSubtitleFile(const std::string& name);
+// Whether the reader of films is the first that is tried; a film may have subtitles.
+bool isFilm(const std::string& name);
+// The number of the subtitles in the file that `choice` means: a number, a language ("fra") or "", the first.
+// Throws Failure (input) if the file has none of text, or not that.
+int subtitleStream(const std::string& name, const std::string& choice);
 
 // Throws Failure (input) for a file that was refused as SCC: it is none, or has no caption lines.
 [[noreturn]] void refuseScc(const std::string& name);

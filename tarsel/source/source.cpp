@@ -69,6 +69,13 @@ int printWarnings() {
     return static_cast<int>(lines.size());
 }
 
+int printConcealed(const Source& source) {
+    const std::string text = source.concealed();
+    if (text.empty()) return 0;
+    tell(Level::warning, lineOf(Msg::filmConcealed, {source.name(), text}));
+    return 1;
+}
+
 std::vector<std::string> moduleNames(int kind) {
     std::vector<std::string> names;
     const AnyVector modules = qv_registry()->modules(kind);
@@ -308,12 +315,6 @@ Any openParameters(const std::string& name) {
     return Any();
 }
 
-// Whether the reader of films is the first that is tried.
-bool isFilm(const std::string& name) {
-    const AnyVector readers = qv_registry()->decoders(QvFile::getExt(Any(name.c_str()), true).asString());
-    return !readers.empty() && readers.at(0) == "avdec";
-}
-
 }  // namespace
 
 std::string Source::head(size_t most) const {
@@ -456,6 +457,8 @@ std::string Source::damage() const {
             const bool video = type == 1;
             const long long present = video ? open_->nrFrames(i) : open_->nrSamples(i);
             const long long expected = params.getInt64(video ? "framesExpected" : "samplesExpected", present);
+            if (const long long lost = params.getInt64("framesLost", 0); lost > 0)
+                return std::to_string(lost) + " of its pictures are missing";
             // Others lack whole frames.
             if (video && decoderName() == "rawdec" && expected == present + 1)
                 return "it ends in the middle of frame " + std::to_string(expected) + ", after " +

@@ -96,6 +96,10 @@ std::vector<std::string> engineWarnings();
 // The same on the standard error, each line once. Returns how many.
 int printWarnings();
 
+// What of the input could not be decoded so far, on the standard error, as a run says it. Returns how many
+// warnings.
+int printConcealed(const Source& source);
+
 // What a module is: one that is registered as a video filter and works on sound is an audio filter.
 int moduleKind(const QvModule& module);
 

@@ -83,7 +83,9 @@ constexpr QvParamRow<Settings> rows[] = {
     {.name = "subtitle_filename",
      .member = &Settings::file,
      .flags = qvParamStored,
-     .help = "a .srt or .sub file; without one nothing is drawn"},
+     .help = "a .srt or .sub file, with normalize also a film; without one nothing is drawn"},
+    {"subtitle_stream", &Settings::stream, qvParamStored, 0, 255, "", "",
+     "which stream of subtitles of a film, with normalize"},
     {.name = "font_filename",
      .member = &Settings::font,
      .flags = qvParamStored,
@@ -255,7 +257,7 @@ int SubtitleWriter::readFile(QvSubtitles& read) {
     const char* const file = settings_.file.c_str();
     if (settings_.normalize) {
         QvSubtitleFindings findings;
-        const int result = read.readFile(file, rate, settings_.encoding, findings);
+        const int result = read.readFile(file, rate, settings_.encoding, findings, settings_.stream);
         if (result != QvStatus::ok && findings.problem != QvSubtitleFindings::noSubtitles)
             return setError(QvStatus::cannotParse, "Failed to read subtitle file %s", file);
         if (findings.hasRate && rateKnown_) read.changeFramerate(rate);

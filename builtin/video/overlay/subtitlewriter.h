@@ -1,7 +1,9 @@
 // Burns a subtitle file into the picture (module "subtitle", which is not registered by itself).
 //
 //     name                 type       default  meaning
-//     "subtitle_filename"  path       ""       an "srt" or "sub" file; "": nothing is drawn
+//     "subtitle_filename"  path       ""       an "srt" or "sub" file, with "normalize" also
+//                                              a film; "": nothing is drawn
+//     "subtitle_stream"    int        0        with "normalize": which subpicture stream of a film
 //     "font_filename"      path       ""       of all three faces; "": the sans fonts of the system
 //     "font_family"        string     ""       replaces "font_filename" if the system has such a font
 //     "font_size"          int        32       pixels, 1 to 4096
@@ -39,6 +41,7 @@
 
 struct SubtitleSettings {
     std::string file, font, family;
+    int stream = 0;
     int fontSize = 32;
     double speed = 1.0;
     double delay = 0.0;

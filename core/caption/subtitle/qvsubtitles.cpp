@@ -8,6 +8,8 @@
 #include "core/caption/subtitle/subtitlecopy_p.h"
 #include "core/caption/subtitle/subtitleparser_p.h"
 #include "core/caption/subtitle/subtitletext_p.h"
+#include "core/decode/decodefactory.h"
+#include "core/decode/qvdecoder.h"
 #include "core/engine/files/qvfileutil.h"
 #include "core/engine/log/qvlog.h"
 #include "core/engine/status.h"
@@ -21,12 +23,12 @@ bool spans(const QvSubtitle& entry, const MediaTime& time) {
     return entry.start <= time && entry.end >= time;
 }
 
+Any extensionOf(const Any& filename) { return filename.isText() ? QvFile::getExt(filename, true) : Any(); }
+
+// 0 for other files.
 int formatOf(const Any& filename) {
-    const Any ext = filename.isText() ? QvFile::getExt(filename, true) : Any();
-    if (ext == "srt") return QvSubtitles::SRT;
-    if (ext == "sub") return QvSubtitles::SUB;
-    qv_dbg()->error("Error: Unsupported subtitle format %s", ext.asString(""));
-    return 0;
+    const Any ext = extensionOf(filename);
+    return ext == "srt" ? QvSubtitles::SRT : ext == "sub" ? QvSubtitles::SUB : 0;
 }
 
 const char* encodingOfBytes(std::string_view text) {
@@ -79,7 +81,7 @@ void echo(std::string text) {
 
 // --- Reading.
 
-int QvSubtitles::begin(const Any& filename, const QvFramerate& rate) {
+void QvSubtitles::clear(const QvFramerate& rate) {
     rate_ = rate;
     maxRows_ = 0;
     entries_.clear();
@@ -88,8 +90,15 @@ int QvSubtitles::begin(const Any& filename, const QvFramerate& rate) {
     unmarked_ = "";
     subViewer_ = false;
     unread_ = 0;
+}
+
+int QvSubtitles::begin(const Any& filename, const QvFramerate& rate) {
+    clear(rate);
     const int format = formatOf(filename);
-    if (format == 0) return QvStatus::failed;
+    if (format == 0) {
+        qv_dbg()->error("Error: Unsupported subtitle format %s", extensionOf(filename).asString(""));
+        return QvStatus::failed;
+    }
     format_ = static_cast<Format>(format);
     return QvStatus::ok;
 }
@@ -122,9 +131,35 @@ int QvSubtitles::parseBytes(const SubtitleBytes& file) {
     return status;
 }
 
+int QvSubtitles::readFilm(const Any& filename, int stream, QvSubtitleFindings& findings) {
+    format_ = SRT;
+    const std::unique_ptr<QvDecodePipe> film(QvDecFactory::decodePipe(filename));
+    if (!film) {
+        findings.problem = QvSubtitleFindings::unreadable;
+        return QvStatus::failed;
+    }
+    unmarked_ = "UTF-8";
+    findings.encoding = unmarked_;
+    const bool there = stream >= 0 && stream < film->nrStreams(qvSubpicStream);
+    const Any texts = there ? film->getSubpicParam(stream, "subtitles") : Any();
+    if (texts.isVector()) {
+        for (const Any& text : texts.asVector())
+            append(text.asDict().getString("text", ""), text.asDict().get("start").asMediaTime(),
+                   text.asDict().get("end").asMediaTime());
+        findings.lost = film->getSubpicParam(stream, "lost").asInt32(0);
+    }
+    if (!entries_.empty()) return QvStatus::ok;
+    findings.problem = QvSubtitleFindings::noSubtitles;
+    return QvStatus::failed;
+}
+
 int QvSubtitles::readFile(const Any& filename, const QvFramerate& rate, int encoding,
-                          QvSubtitleFindings& findings) {
+                          QvSubtitleFindings& findings, int stream) {
     findings = QvSubtitleFindings();
+    if (formatOf(filename) == 0) {
+        clear(rate);
+        return readFilm(filename, stream, findings);
+    }
     SubtitleBytes file;
     if (begin(filename, rate) != QvStatus::ok || file.read(filename) != QvStatus::ok) {
         findings.problem = QvSubtitleFindings::unreadable;
@@ -156,6 +191,11 @@ void QvSubtitles::take(ParsedSubtitle&& parsed) {
     entry->end = parsed.end;
     subViewer_ |= parsed.subViewer;
     entries_.push_back(std::move(entry));
+}
+
+void QvSubtitles::append(const std::string& text, const MediaTime& start, const MediaTime& end) {
+    take({start, end, text});
+    maxRows_ = std::max(maxRows_, entries_.back()->rows);
 }
 
 int QvSubtitles::parse(std::string_view text, std::size_t bound) {

@@ -73,9 +73,13 @@ class QV_API QvSubtitles {
     int parseSource(QvByteSource& source, const Any& name, const QvFramerate& rate);
     // For files of any origin: parseFile on a copy in memory, which is converted to UTF-8 and to the line
     // ends, times, tags and order that parseFile expects. `encoding`: of QvText, for a file without a byte
-    // order mark; 0: ASCII or UTF-8, and if it is neither, the most probable one. 0, or -1 if there are no
-    // subtitles in the file.
-    int readFile(const Any& filename, const QvFramerate& rate, int encoding, QvSubtitleFindings& findings);
+    // order mark; 0: ASCII or UTF-8, and if it is neither, the most probable one. Any other file than "srt"
+    // and "sub" is opened as a film, and its subpicture stream `stream`, from 0 on, is read if that is text.
+    // 0, or -1 if there are no subtitles in the file.
+    int readFile(const Any& filename, const QvFramerate& rate, int encoding, QvSubtitleFindings& findings,
+                 int stream = 0);
+    // After all others, which start no later. `text`: UTF-8, lines separated by "|".
+    void append(const std::string& text, const MediaTime& start, const MediaTime& end);
     // Writes all entries; a SUB file gets frame numbers at rate(). The lines are also printed on the standard
     // output. -1 if the file can't be written completely.
     int saveToFile(const Any& filename, Format format) const;
@@ -114,7 +118,9 @@ class QV_API QvSubtitles {
     long long unread_ = 0;
     QvFramerate rate_;
 
+    void clear(const QvFramerate& rate);
     int begin(const Any& filename, const QvFramerate& rate);
+    int readFilm(const Any& filename, int stream, QvSubtitleFindings& findings);
     int parseBytes(const SubtitleBytes& bytes);
     void take(ParsedSubtitle&& parsed);
     int parse(std::string_view text, std::size_t bound);

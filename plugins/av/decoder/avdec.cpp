@@ -1,5 +1,6 @@
 #include "plugins/av/decoder/avdec.h"
 
+#include <algorithm>
 #include <cstring>
 #include <new>
 
@@ -141,6 +142,7 @@ int AvDec::openFilm() {
         if (!probe) return refuse(reason);
         fileSize_ = probe->size();
         if (!probe->seekable()) return refuse("it has to be sought, and a pipe can't be; put it into a file");
+        extent_ = extentOf(*probe);
     }
     const auto input = MediaInput::open(*bytes_, settings_.container, reason);
     if (!input) return refuse(reason);
@@ -155,7 +157,7 @@ int AvDec::openFilm() {
 // line in the log; `reason` is the first of these.
 void AvDec::addStreams(MediaInput& input, std::string& reason) {
     const AVFormatContext& container = input.context();
-    const FilmLength length(container, *index_, fileSize_);
+    const FilmLength length(container, *index_, fileSize_, extent_);
     FilmZero zero;
     const auto leaveOut = [&](unsigned number, const std::string& why) {
         qv_log()->warning("Stream %u of '%s' is left out: %s", number, filename().toString().asString(""),
@@ -179,6 +181,7 @@ void AvDec::addStreams(MediaInput& input, std::string& reason) {
                                   i, filename().toString().asString(""));
             auto* const added = addStream(std::make_unique<PictureStream>(std::move(reader), &stream));
             const PictureFormat& format = added->reader().format();
+            if (const long long lost = covers ? 0 : length.lost(stream); lost > 0) added->setLost(lost);
             if (!covers && length.isCut(stream))
                 added->setTruncated(length.announced(stream, format.rate.rate().ratio(), format.frames));
         }
@@ -206,6 +209,14 @@ void AvDec::addStreams(MediaInput& input, std::string& reason) {
             added->setTruncated(length.announced(stream, format.samplerate, format.samples));
     }
     if (streams().empty()) addPictures(true);
+    for (unsigned i = 0; zero.known && i < container.nb_streams; ++i) {
+        const AVStream& stream = *container.streams[i];
+        if (!SubtitleReader::isText(stream)) continue;
+        addStream(std::make_unique<SubtitleStream>(
+            std::make_unique<SubtitleReader>(*bytes_, settings_.container, stream, index_, zero.time,
+                                             zero.base),
+            stream));
+    }
     facts_ = filmFacts(container, zero);
 }
 
@@ -246,6 +257,54 @@ int AvDec::readSamples(int count, int stream) {
     if (result == QvStatus::cannotParse)
         return setError(result, "read samples failed: %s", sound.reader().failure().c_str());
     return result;
+}
+
+// --- Subtitles go with the pictures.
+
+int AvDec::pictureOf(int subpicture) const { return std::min(subpicture, nrStreams(qvVideoStream) - 1); }
+
+void AvDec::getStreamParam(int type, int stream, const char* name, Any& value) const {
+    if (type == qvSubpicStream && (std::strcmp(name, "subtitles") == 0 || std::strcmp(name, "lost") == 0)) {
+        checkStream(type, stream, "getStreamParam");
+        SubtitleReader& reader = static_cast<SubtitleStream&>(*findStream(type, stream)).reader();
+        if (std::strcmp(name, "lost") == 0)
+            value = reader.lost();
+        else
+            value = Any(reader.entries());
+        if (!reader.failure().empty())
+            qv_log()->warning("The subtitles of '%s' can't be read: %s", filename().toString().asString(""),
+                              reader.failure().c_str());
+        return;
+    }
+    BaseDecodePipe::getStreamParam(type, stream, name, value);
+}
+
+int AvDec::readMeta(int stream, int, AnyDict& out) {
+    checkStream(qvSubpicStream, stream, "readMeta");
+    const auto& pictures = static_cast<PictureStream&>(*findStream(qvVideoStream, pictureOf(stream)));
+    QvSubtitles& texts =
+        static_cast<SubtitleStream&>(*findStream(qvSubpicStream, stream)).reader().subtitles();
+    const QvSubtitle* const shown = texts.find(pictures.shownAt());
+    if (!shown) return QvStatus::failed;
+    out.set("name", "subtitle");
+    out.set("format", static_cast<int>(QvSubtitles::SRT));
+    out.set("text", shown->text);
+    out.set("rows", shown->rows);
+    out.set("start", shown->start);
+    out.set("end", shown->end);
+    return QvStatus::ok;
+}
+
+int AvDec::seek(const MediaTime& time, int type, int stream) {
+    if (type != qvSubpicStream) return BaseDecodePipe::seek(time, type, stream);
+    checkStream(type, stream, "seek");
+    return BaseDecodePipe::seek(time, qvVideoStream, pictureOf(stream));
+}
+
+MediaTime AvDec::duration(int type, int stream) {
+    if (type != qvSubpicStream) return BaseDecodePipe::duration(type, stream);
+    checkStream(type, stream, "duration");
+    return static_cast<SubtitleStream&>(*findStream(type, stream)).reader().end();
 }
 
 QvFrame* AvDec::getFramePtr(int stream) {

@@ -23,16 +23,22 @@
 //     "variableRate"   Int32   1: "framerate" is the nearest usual rate, frames repeat or skip pictures
 //     "conversion"     String  what the pixel format can't hold, or how the frames are made of the pictures
 //     "concealed"      Int64   pictures so far that were damaged or did not come
+//     "framesLost"     Int64   pictures that are missing between others, where bytes of the file are missing;
+//                              "truncated" is set, too
 //     "codecProfile"   String  of the codec: "High", "Main 10"
 //     "language"       String  where the container has it; so "title"
 //     "codecParams"    Dict    "pid", where the container numbers its streams
 // clang-format on
 //
 // A stream of sound has "codecProfile", "language", "title", "channelMask" (Int64), "conversion" (why it ends
-// early), "concealed" (packets) and "codecParams". AC-3 and E-AC-3 have the codec "Dolby", "codecProfile"
-// says which, and "dolby" is the Dict of the positions of "L", "R", "C", "Ls", "Rs" and "SUB" among the
-// channels. The decoder's "meta" is the Dict of what the film says of itself, see filmfacts.h. A file that is
-// cut or damaged delivers what is there, see "truncated" in the contract.
+// early), "concealed" (packets) and "codecParams". Text subtitles of a film of pictures are subpicture
+// streams with the parameters of those of "subimport", "language", "title" and, only when it is asked for by
+// its name, "subtitles": a Vector of Dicts of "start" and "end" (MediaTime from the first picture) and "text"
+// (lines separated by "|"); after that "lost" (how many of them are no valid text). readMeta gives what is
+// shown in the frame that was read last. AC-3 and E-AC-3 have the codec "Dolby", "codecProfile" says which,
+// and "dolby" is the Dict of the positions of "L", "R", "C", "Ls", "Rs" and "SUB" among the channels. The
+// decoder's "meta" is the Dict of what the film says of itself, see filmfacts.h. A file that is cut or
+// damaged delivers what is there, see "truncated" in the contract.
 #pragma once
 
 #include <memory>
@@ -40,6 +46,7 @@
 
 #include "core/decode/basedecodepipe.h"
 #include "core/measure/qvframerate.h"
+#include "plugins/av/source/fileextent.h"
 #include "plugins/av/source/mediainput.h"
 
 class QvByteSource;
@@ -64,6 +71,7 @@ class AvDec : public BaseDecodePipe {
     };
 
     using BaseDecodePipe::getParam;
+    using BaseDecodePipe::getStreamParam;
     int setParam(const char* name, const Any& value) override;
     void getParam(const char* name, Any& value) const override;
     int open() override;
@@ -72,6 +80,12 @@ class AvDec : public BaseDecodePipe {
     int seekToSample(long long sample, int stream) override;
     int readFrame(int stream) override;
     int readSamples(int count, int stream) override;
+    void getStreamParam(int type, int stream, const char* name, Any& value) const override;
+    // As "subimport"; of a subpicture stream, in the frame that the video stream of its number, or the last
+    // one, delivered.
+    int readMeta(int stream, int kind, AnyDict& out) override;
+    int seek(const MediaTime& time, int type, int stream) override;
+    MediaTime duration(int type, int stream) override;
     QvFrame* getFramePtr(int stream) override;
     QvPcm* getAudioPtr(int stream) override;
 
@@ -82,10 +96,12 @@ class AvDec : public BaseDecodePipe {
     AnyDict facts_;
     AnyVector inputFiles_;  // of pictures that are files
     long long fileSize_ = -1;
+    FileExtent extent_;
 
     int setAll(const Any& value);
     int refuse(const std::string& reason);
     void addStreams(MediaInput& input, std::string& reason);
+    int pictureOf(int subpicture) const;
     int openFilm();
     int openPictures();
 };

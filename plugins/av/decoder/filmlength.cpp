@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cmath>
 #include <cstring>
+#include <vector>
 
 #include "plugins/av/index/packetindex.h"
 #include "plugins/av/source/avheaders.h"
@@ -22,8 +23,13 @@ constexpr Stated stated[] = {{"matroska", 0.01, 1}, {"avi", 0.01, 1}, {"mxf", 0.
 
 }  // namespace
 
-FilmLength::FilmLength(const AVFormatContext& container, const PacketIndex& index, long long bytes)
-    : container_(container), index_(index), bytes_(bytes), cut_(!index.damage().empty() || endsEarly()) {}
+FilmLength::FilmLength(const AVFormatContext& container, const PacketIndex& index, long long bytes,
+                       const FileExtent& extent)
+    : container_(container),
+      index_(index),
+      bytes_(bytes),
+      extent_(extent),
+      cut_(!index.damage().empty() || endsEarly()) {}
 
 // The library has several names for one format.
 bool FilmLength::is(const char* format) const { return av_match_name(format, container_.iformat->name) > 0; }
@@ -40,7 +46,8 @@ double FilmLength::seconds(const AVStream& stream) const {
     return 0;
 }
 
-// Seconds from the first packet to the end of the last one.
+// Seconds from the first packet to the end of the last one; from 0 where the first is later, because then
+// some writers count the time before it, too.
 double FilmLength::present() const {
     double first = 0, last = 0;
     bool any = false;
@@ -55,7 +62,7 @@ double FilmLength::present() const {
             any = true;
         }
     }
-    return any ? last - first : 0;
+    return any ? last - std::min(first, 0.0) : 0;
 }
 
 bool FilmLength::endsEarly() const {
@@ -91,7 +98,30 @@ bool FilmLength::endsWithinPicture(const AVStream& stream) const {
 // Where the library fits the length to the size of the file, but keeps the number.
 long long FilmLength::announcedSamples(const AVStream& stream) const {
     const bool plain = av_get_bits_per_sample(stream.codecpar->codec_id) > 0;
+    if (is("w64") && plain && extent_.bytes > bytes_ && stream.codecpar->block_align > 0)
+        return std::max<std::int64_t>(stream.duration, 0) +
+               (extent_.bytes - bytes_) / stream.codecpar->block_align;
     return is("caf") && plain ? stream.nb_frames : 0;
+}
+
+// The usual step between two pictures says how many are missing in one that is longer.
+long long FilmLength::lost(const AVStream& stream) const {
+    if (!extent_.broken && extent_.bytes <= bytes_) return 0;
+    std::vector<std::int64_t> times;
+    for (const IndexedPacket& packet : index_.packets(stream.index))
+        if (packet.pts != AV_NOPTS_VALUE) times.push_back(packet.pts);
+    if (times.size() < 3) return 0;
+    std::sort(times.begin(), times.end());
+    std::vector<std::int64_t> steps;
+    for (std::size_t i = 1; i < times.size(); ++i) steps.push_back(times[i] - times[i - 1]);
+    std::vector<std::int64_t> sorted = steps;
+    const auto middle = sorted.begin() + static_cast<std::ptrdiff_t>(sorted.size() / 2);
+    std::nth_element(sorted.begin(), middle, sorted.end());
+    const std::int64_t usual = std::max<std::int64_t>(*middle, 1);
+    long long lost = 0;
+    for (const std::int64_t step : steps)
+        if (step > 2 * usual) lost += (step + usual / 2) / usual - 1;
+    return lost;
 }
 
 bool FilmLength::isCut(const AVStream& stream) const {

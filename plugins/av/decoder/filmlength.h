@@ -3,6 +3,8 @@
 
 #include <cstdint>
 
+#include "plugins/av/source/fileextent.h"
+
 struct AVFormatContext;
 struct AVStream;
 
@@ -13,10 +15,13 @@ class PacketIndex;
 class FilmLength {
   public:
     // `bytes` of the file. All outlive this.
-    FilmLength(const AVFormatContext& container, const PacketIndex& index, long long bytes);
+    FilmLength(const AVFormatContext& container, const PacketIndex& index, long long bytes,
+               const FileExtent& extent);
 
     // Something is missing: of the file, or of this stream.
     bool isCut(const AVStream& stream) const;
+    // Pictures that are missing between others, where the file says that bytes are missing.
+    long long lost(const AVStream& stream) const;
     // Frames or samples of the whole stream, at `rate` a second, of which `present` are there; 0 for unknown.
     long long announced(const AVStream& stream, double rate, long long present) const;
 
@@ -24,6 +29,7 @@ class FilmLength {
     const AVFormatContext& container_;
     const PacketIndex& index_;
     long long bytes_;
+    FileExtent extent_;
     bool cut_;  // the file
 
     bool is(const char* format) const;

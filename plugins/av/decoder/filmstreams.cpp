@@ -57,12 +57,24 @@ PictureStream::PictureStream(std::unique_ptr<PictureSource> reader, const AVStre
     if (stream) describeStream(*stream, params);
 }
 
+bool PictureStream::seek(long long frame) {
+    if (frame < 0 || frame > reader_->format().frames || !reader_->seek(static_cast<int>(frame)))
+        return false;
+    next_ = frame;
+    return true;
+}
+
+MediaTime PictureStream::shownAt() const {
+    return MediaTime(std::max(next_ - 1, 0LL), reader_->format().rate, MediaTime::defaultTimescale);
+}
+
 int PictureStream::read() {
     switch (reader_->read()) {
         case FrameReader::Read::end: return QvStatus::endOfStream;
         case FrameReader::Read::failed: return QvStatus::cannotParse;
         case FrameReader::Read::picture: break;
     }
+    ++next_;
     if (reader_->concealed() != concealed_) {
         concealed_ = reader_->concealed();
         params.set("concealed", Any(static_cast<long long>(concealed_)));
@@ -74,6 +86,12 @@ void PictureStream::setTruncated(long long expected) {
     if (expected <= reader_->format().frames) return;
     params.set("truncated", 1);
     params.set("framesExpected", Any(expected));
+}
+
+void PictureStream::setLost(long long pictures) {
+    params.set("truncated", 1);
+    params.set("framesLost", Any(pictures));
+    params.set("framesExpected", reader_->format().frames);
 }
 
 SoundStream::SoundStream(std::unique_ptr<SampleReader> reader, const AVStream& stream)
@@ -132,6 +150,22 @@ void SoundStream::setTruncated(long long expected) {
     if (expected <= reader_->format().samples) return;
     params.set("truncated", 1);
     params.set("samplesExpected", Any(expected));
+}
+
+SubtitleStream::SubtitleStream(std::unique_ptr<SubtitleReader> reader, const AVStream& stream)
+    : DPipeStream(qvSubpicStream), reader_(std::move(reader)) {
+    params.set("type", 1);
+    params.set("format", static_cast<int>(QvSubtitles::SRT));
+    params.set("count", reader_->count());
+    params.set("encoding", 0);
+    params.set("codec", SubtitleReader::codecName(stream));
+    params.set("textEncoding", "UTF-8");
+    describeStream(stream, params);
+    if (reader_->count() == 0) return;
+    params.set("first", reader_->first());
+    params.set("last", reader_->last());
+    params.set("duration", reader_->last() - reader_->first());
+    params.set("end", reader_->end());
 }
 
 }  // namespace av

@@ -8,6 +8,7 @@
 #include "core/media/qvbuffer.h"
 #include "plugins/av/picture/framereader.h"
 #include "plugins/av/sound/samplereader.h"
+#include "plugins/av/text/subtitlereader.h"
 
 struct AVStream;
 
@@ -22,16 +23,18 @@ class PictureStream : public DPipeVideoStream {
     PictureStream(std::unique_ptr<PictureSource> reader, const AVStream* stream);
 
     int read();  // as readFrame
-    bool seek(long long frame) {
-        return frame >= 0 && frame <= reader_->format().frames && reader_->seek(static_cast<int>(frame));
-    }
+    bool seek(long long frame);
+    // The start of the frame that was read last, on the film's clock.
+    MediaTime shownAt() const;
     PictureSource& reader() { return *reader_; }
     // The file was cut, or is damaged. Nothing changes if it has what it announces all the same.
     void setTruncated(long long expected);
+    void setLost(long long pictures);  // between others
 
   private:
     std::unique_ptr<PictureSource> reader_;
     int concealed_ = 0;
+    long long next_ = 0;  // frame
 };
 
 class SoundStream : public DPipeAudioStream {
@@ -46,6 +49,15 @@ class SoundStream : public DPipeAudioStream {
   private:
     std::unique_ptr<SampleReader> reader_;
     long long position_ = 0, concealed_ = 0;
+};
+
+class SubtitleStream : public DPipeStream {
+  public:
+    SubtitleStream(std::unique_ptr<SubtitleReader> reader, const AVStream& stream);
+    SubtitleReader& reader() { return *reader_; }
+
+  private:
+    std::unique_ptr<SubtitleReader> reader_;
 };
 
 }  // namespace av

@@ -49,6 +49,7 @@ bool DecodedPictures::openCodec(std::string& reason) {
         return false;
     }
     codec_->pkt_timebase = stream().time_base;
+    concealed_.watch(*codec_);
     codec_->max_pixels = limits::pixels;
     codec_->thread_count = std::clamp(threads_ > 0 ? threads_ : qv_platform().processors(), 1, mostThreads);
     codec_->thread_type = FF_THREAD_FRAME | FF_THREAD_SLICE;
@@ -120,6 +121,13 @@ DecodedPictures::Next DecodedPictures::next(AVFrame& picture) {
         if (draining_) continue;  // a damaged picture among the last ones
         if (!feed()) return Next::failed;
     }
+}
+
+bool DecodedPictures::isConcealed(const AVFrame& picture, std::size_t packet) const {
+    // With threads of frames flags may be set too late; see ConcealedPackets.
+    const bool late = (codec_->active_thread_type & FF_THREAD_FRAME) != 0;
+    const int flags = late ? 0 : picture.decode_error_flags & ~FF_DECODE_ERROR_CONCEALMENT_ACTIVE;
+    return flags != 0 || (picture.flags & AV_FRAME_FLAG_CORRUPT) != 0 || concealed_.has(packet);
 }
 
 }  // namespace av

@@ -7,6 +7,7 @@
 
 #include "plugins/av/index/packetindex.h"
 #include "plugins/av/source/avheaders.h"
+#include "plugins/av/source/concealedpackets.h"
 #include "plugins/av/source/mediainput.h"
 
 namespace av {
@@ -33,12 +34,16 @@ class DecodedPictures {
     static std::size_t packetOf(const AVFrame& picture) {
         return static_cast<std::size_t>(picture.reordered_opaque);
     }
+    // Whether the picture has errors that the codec concealed, as far as they are in that packet: a field may
+    // have one of its own.
+    bool isConcealed(const AVFrame& picture, std::size_t packet) const;
     const std::string& failure() const { return failure_; }
 
   private:
     std::unique_ptr<MediaInput> input_;
     std::shared_ptr<const PacketIndex> index_;
     int stream_ = 0;
+    ConcealedPackets concealed_;
     CodecPtr codec_;
     PacketPtr packet_;
     bool waiting_ = false;  // packet_ was not taken yet

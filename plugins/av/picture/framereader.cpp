@@ -222,8 +222,10 @@ FrameReader::Read FrameReader::Decoding::pull(std::string& failure) {
                 const std::size_t packet = DecodedPictures::packetOf(*coming_);
                 if (packet >= number_.size() || number_[packet] == notShown) continue;
                 comingNumber_ = number_[packet];
-                if (coming_->decode_error_flags || (coming_->flags & AV_FRAME_FLAG_CORRUPT))
-                    conceal(*comingNumber_);
+                bool damaged = source_->isConcealed(*coming_, packet);
+                for (std::size_t i = packet + 1; i < number_.size() && number_[i] == notShown; ++i)
+                    damaged = damaged || source_->isConcealed(*coming_, i);
+                if (damaged) conceal(*comingNumber_);
                 return Read::picture;
             }
         }

@@ -6,6 +6,7 @@
 
 #include "core/engine/log/qvlog.h"
 #include "plugins/av/source/avheaders.h"
+#include "plugins/av/source/concealedpackets.h"
 #include "plugins/av/source/limits.h"
 
 namespace av {
@@ -14,6 +15,7 @@ namespace {
 
 // On any thread of the libraries: the line lives on the stack.
 void toEngine(void* object, int level, const char* format, va_list args) {
+    ConcealedPackets::heard(object, format);
     if (level > AV_LOG_WARNING || !qv_dbg()->hasTarget()) return;
     char text[1024];
     int prefix = 1;

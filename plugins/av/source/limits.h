@@ -17,6 +17,7 @@ inline constexpr int channels = 64;
 inline constexpr int samplerate = 768'000;                       // Hz
 inline constexpr std::size_t allocation = std::size_t{1} << 30;  // one block of the libraries
 inline constexpr std::size_t packets = std::size_t{64} << 20;    // of a file
+inline constexpr std::size_t subtitleBytes = std::size_t{64} << 20;  // of a stream
 inline constexpr int frames = 0x3fffffff;                        // of a stream
 inline constexpr int variableFrames = 64 << 20;  // of a stream of variable rate, which needs a table
 

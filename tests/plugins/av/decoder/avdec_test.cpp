@@ -128,6 +128,7 @@ TEST_F(FilmsInTheTool, whoseHeadersStateMoreThanIsThereAreRefused) {
         {"cut.aiff", {}},
         {"cut.au", {}},
         {"cut.caf", {"-c:a", "pcm_s16le"}},
+        {"cut.w64", {"-c:a", "pcm_s16le"}},
         {"cut.mxf",
          {"-f", "lavfi", "-i", "testsrc2=size=96x64:duration=8", "-c:v", "mpeg2video", "-c:a", "pcm_s16le",
           "-ar", "48000"}},
@@ -146,14 +147,65 @@ TEST_F(FilmsInTheTool, whoseHeadersStateMoreThanIsThereAreRefused) {
     }
 }
 
+// 24 pictures are in each cluster, and two of them are lost; or those of the first, the head of which is
+// damaged.
+TEST_F(FilmsInTheTool, thatLackBytesInTheMiddleSayHowManyPictures) {
+    const std::string whole =
+        TempFolder::read(film("film.mkv", {"-c:v", "mpeg4", "-g", "12", "-cluster_time_limit", "960"},
+                              "testsrc2=size=96x64:rate=25:duration=8"));
+    const std::string head = "\x1F\x43\xB6\x75";
+    const std::size_t first = whole.find(head, whole.find(head) + 1);
+    const std::size_t second = whole.find(head, whole.find(head, first + 4) + 4);
+    ASSERT_LT(second, whole.size());
+    std::string zeros = whole;
+    zeros.replace(first, second - first, second - first, '\0');
+    for (const std::string& bytes : {whole.substr(0, first) + whole.substr(second), zeros}) {
+        folder.write("film.mkv", bytes);
+        const Outcome refused = tarsel({"transcode", "film.mkv", "-y", "-o", "x.avi", "--muxer", "nullmux"});
+        EXPECT_EQ(refused.status, 3) << refused.err;
+        EXPECT_THAT(refused.err, HasSubstr("24 of its pictures are missing"));
+        EXPECT_EQ(
+            tarsel({"transcode", "film.mkv", "--accept-partial", "-y", "-o", "x.avi", "--muxer", "nullmux"})
+                .status,
+            0);
+    }
+    folder.write("film.mkv", whole);
+    EXPECT_EQ(tarsel({"transcode", "film.mkv", "-y", "-o", "x.avi", "--muxer", "nullmux"}).status, 0);
+}
+
 TEST_F(FilmsInTheTool, whosePicturesAreDamagedSayHowMany) {
     std::string bytes = TempFolder::read(film("film.avi", {"-c:v", "mjpeg"}));
     for (std::size_t at = bytes.size() / 2; at < bytes.size() / 2 + 1500; ++at) bytes[at] = 0;
     folder.write("film.avi", bytes);
-    const Outcome o =
-        tarsel({"transcode", "--accept-partial", "film.avi", "-o", "x.avi", "--muxer", "nullmux"});
-    EXPECT_EQ(o.status, 0) << o.err;
-    EXPECT_THAT(o.err, HasSubstr("could not be decoded"));
+    const auto line = [this](const Words& words) {
+        const Outcome o = tarsel(words);
+        EXPECT_EQ(o.status, 0) << o.err;
+        const std::size_t at = o.err.find("'film.avi' is damaged in places: ");
+        return at == std::string::npos ? o.err : o.err.substr(at, o.err.find('\n', at) - at);
+    };
+    const std::string said = line({"transcode", "film.avi", "-o", "x.avi", "--muxer", "nullmux"});
+    EXPECT_THAT(said, HasSubstr("could not be decoded"));
+    EXPECT_EQ(line({"scope", "film.avi"}), said);
+    EXPECT_EQ(line({"compare", "film.avi", "film.avi"}), said);
+    EXPECT_EQ(line({"frame", "film.avi", "--sheet", "10x5", "-o", "x.png"}), said);
+    EXPECT_EQ(tarsel({"frame", "film.avi", "--sheet", "10x5", "--strict", "-y", "-o", "x.png"}).status, 1);
+    EXPECT_EQ(tarsel({"frame", "film.avi", "--strict", "-o", "first.png"}).status, 0);
+}
+
+TEST_F(FilmsInTheTool, whosePicturesAreDamagedSayTheSameWithAnyThreads) {
+    std::string bytes =
+        TempFolder::read(film("film.mp4", {"-c:v", "libx264", "-bf", "2", "-movflags", "+faststart"},
+                              "testsrc2=size=320x240:rate=25:duration=4"));
+    for (std::size_t at = bytes.size() / 4; at < bytes.size(); at += bytes.size() / 20) bytes[at] ^= 0x55;
+    folder.write("film.mp4", bytes);
+    std::string said;
+    for (const char* threads : {"1", "2", "3", "8", "8", "8"}) {
+        const Outcome o = tarsel(
+            {"transcode", "film.mp4", "--threads", threads, "-y", "-o", "x.avi", "--muxer", "nullmux"});
+        EXPECT_THAT(o.err, HasSubstr("could not be decoded"));
+        if (said.empty()) said = o.err;
+        EXPECT_EQ(o.err, said) << threads;
+    }
 }
 
 TEST_F(FilmsInTheTool, bringTheirSound) {

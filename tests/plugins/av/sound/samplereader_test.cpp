@@ -57,6 +57,30 @@ class SampleReaderOfFilms : public Films {
         return whole;
     }
 
+    // All samples, then those after a seek to any, against what ffmpeg decodes.
+    void compare(const std::string& file, bool told, bool clean = true) {
+        const auto reader = open(file);
+        ASSERT_TRUE(reader);
+        const auto& packets = index_->packets(0);
+        EXPECT_EQ(std::none_of(packets.begin(), packets.end(),
+                               [](const auto& packet) { return packet.samples == av::unknownSamples; }),
+                  told);
+        const av::SoundFormat& format = reader->format();
+        const std::string whole = expected(file, format.bits);
+        const std::size_t size = static_cast<std::size_t>(format.channels * format.bits / 8);
+        ASSERT_EQ(static_cast<std::size_t>(format.samples) * size, whole.size());
+        ASSERT_TRUE(read(*reader, static_cast<int>(format.samples)) == whole);
+        EXPECT_EQ(read(*reader, 10), "");
+        std::mt19937 random(1);
+        for (int i = 0; i < 20; ++i) {
+            const std::size_t sample = random() % static_cast<std::size_t>(format.samples);
+            ASSERT_TRUE(reader->seek(static_cast<long long>(sample)));
+            const std::string part = read(*reader, 3000);
+            ASSERT_TRUE(part == whole.substr(sample * size, 3000 * size)) << "after a seek to " << sample;
+        }
+        EXPECT_TRUE(!clean || reader->concealed() == 0);
+    }
+
     EngineScope engine_;
     std::unique_ptr<av::MediaBytes> bytes_;
     std::shared_ptr<const av::PacketIndex> index_;
@@ -70,6 +94,7 @@ TEST_F(SampleReaderOfFilms, samplesAreThoseOfAReadingFromTheStartWhereverReading
     } cases[] = {
         {"a.m4a", {"-c:a", "aac", "-b:a", "48k"}, true},
         {"a.aac", {"-c:a", "aac"}, true},
+        {"opus.mp4", {"-c:a", "libopus"}, true},
         {"a.mp3", {"-c:a", "libmp3lame", "-b:a", "32k"}, true},
         {"a.mp2", {"-c:a", "mp2"}, true},
         {"a.opus", {"-c:a", "libopus"}, true},
@@ -89,26 +114,7 @@ TEST_F(SampleReaderOfFilms, samplesAreThoseOfAReadingFromTheStartWhereverReading
         SCOPED_TRACE(c.name);
         const std::string file =
             film(c.name, c.options, "aevalsrc='sin(900*t*t)/2+random(0)/9|sin(2000*t)/3':s=48000:d=3");
-        const auto reader = open(file);
-        ASSERT_TRUE(reader);
-        const auto& packets = index_->packets(0);
-        EXPECT_EQ(std::none_of(packets.begin(), packets.end(),
-                               [](const auto& packet) { return packet.samples == av::unknownSamples; }),
-                  c.told);
-        const av::SoundFormat& format = reader->format();
-        const std::string whole = expected(file, format.bits);
-        const std::size_t size = static_cast<std::size_t>(format.channels * format.bits / 8);
-        ASSERT_EQ(static_cast<std::size_t>(format.samples) * size, whole.size());
-        ASSERT_TRUE(read(*reader, static_cast<int>(format.samples)) == whole);
-        EXPECT_EQ(read(*reader, 10), "");
-        std::mt19937 random(1);
-        for (int i = 0; i < 20; ++i) {
-            const std::size_t sample = random() % static_cast<std::size_t>(format.samples);
-            ASSERT_TRUE(reader->seek(static_cast<long long>(sample)));
-            const std::string part = read(*reader, 3000);
-            ASSERT_TRUE(part == whole.substr(sample * size, 3000 * size)) << "after a seek to " << sample;
-        }
-        EXPECT_EQ(reader->concealed(), 0);
+        compare(file, c.told);
     }
 }
 
@@ -128,12 +134,48 @@ TEST_F(SampleReaderOfFilms, endWhereTheirFormChanges) {
     EXPECT_NEAR(static_cast<double>(reader->format().samples), 44100, 1200);
 }
 
+// Frames of all modes follow each other, with those that say that there is nothing.
+TEST_F(SampleReaderOfFilms, ofSpeechAreCountedByTheirModes) {
+    const struct {
+        const char *name, *head;
+        std::vector<int> bytes;  // of a frame's bits, by mode
+    } kinds[] = {{"a.amr", "#!AMR\n", {12, 13, 15, 17, 19, 20, 26, 31}},
+                 {"wide.amr", "#!AMR-WB\n", {17, 23, 32, 36, 40, 46, 50, 58, 60}}};
+    for (const auto& kind : kinds) {
+        SCOPED_TRACE(kind.name);
+        std::mt19937 random(2);
+        std::string bytes = kind.head;
+        for (int frame = 0; frame < 150; ++frame) {
+            const auto mode =
+                static_cast<std::size_t>(frame % 30 < 20 ? 2 : frame % static_cast<int>(kind.bytes.size()));
+            bytes += static_cast<char>(mode << 3 | 4);
+            for (int i = 0; i < kind.bytes[mode]; ++i) bytes += static_cast<char>(random());
+            if (frame % 40 == 0) bytes += static_cast<char>(15 << 3 | 4);
+        }
+        // Codecs refuse some of these bits.
+        compare(folder.write(kind.name, bytes), true, false);
+    }
+}
+
 // Priming and padding are cut: what went in comes out, as long as it was.
 TEST_F(SampleReaderOfFilms, haveTheLengthOfWhatWasEncoded) {
-    for (const char* name : {"a.mp3", "a.opus", "a.ogg", "a.flac", "a.wav"}) {
-        const auto reader = open(film(name, {}, "sine=sample_rate=48000:duration=2.345"));
-        ASSERT_TRUE(reader) << name;
-        EXPECT_EQ(reader->format().samples, 112560) << name;
+    const struct {
+        const char* name;
+        Words options;
+    } cases[] = {
+        {"a.mp3", {}},
+        {"a.opus", {}},
+        {"a.ogg", {}},
+        {"a.flac", {}},
+        {"a.wav", {}},
+
+        {"opus.mka", {"-c:a", "libopus"}},
+        {"opus.webm", {"-c:a", "libopus", "-frame_duration", "60"}},
+    };
+    for (const auto& c : cases) {
+        const auto reader = open(film(c.name, c.options, "sine=sample_rate=48000:duration=2.345"));
+        ASSERT_TRUE(reader) << c.name;
+        EXPECT_EQ(reader->format().samples, 112560) << c.name;
     }
 }
 
