@@ -247,6 +247,7 @@ constexpr Message kMessages[] = {
     {Msg::muxerMissing,      Exit::module, "-o {file}",                              "the multiplexer {text} is not installed",               "load the plug-in that has it with --plugins"},
     {Msg::encoderRaw,        Exit::usage,  "{option}",                               "the streams of {file} are raw, and no encoder has a quality to set", "leave it out, or choose an encoder with --vcodec, --acodec or --preset"},
     {Msg::encoderNoTwoPass,  Exit::usage,  "--two-pass",                             "the encoder {name} works in one pass",                  "leave it out, or choose another encoder with --vcodec"},
+    {Msg::encoderNoQuality,  Exit::usage,  "the encoder {name} can't be used",        "neither a quality nor a bit rate is set",               "give --crf a number from 0 on, or --bitrate"},
     {Msg::encoderNoStream,   Exit::usage,  "{option}",                               "the output has no {text}",                              "leave it out"},
     {Msg::bitrateWrong,      Exit::usage,  "{option}",                               "{name} is no bit rate",                                 "write 800k, 5M, or a number of bits a second"},
     {Msg::metaKeyWrong,      Exit::usage,  "{option}",                               "{name} can't be the name of a text",                    "use letters, digits, - and _, 40 at most: title, artist, album, date, comment, ..."},

@@ -247,6 +247,7 @@ enum class Msg : unsigned short {
     muxerMissing,
     encoderRaw,
     encoderNoTwoPass,
+    encoderNoQuality,
     encoderNoStream,
     bitrateWrong,
     metaKeyWrong,

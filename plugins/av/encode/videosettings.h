@@ -30,7 +30,7 @@ struct VideoSettings {
     int n = 1, m = 1;                        // pictures of a group, and from one anchor to the next
     int threads = 0, profile = -1, matrix = 0;
     int primaries = 0, transfer = 0, space = 0;  // code points of ITU-T H.273; 0: by the matrix
-    bool pal = true, twoPass = false, firstPass = false, lowDelay = false;
+    bool pal = true, twoPass = false, firstPass = false;
     int topLines = 0;  // that the picture has above the shown ones
     std::string preset, tune, codecProfile, options;
     std::string profileOptions;   // of the preset

@@ -125,12 +125,39 @@ TEST_F(FilmJobs, areRefusedWithTheEncodersOwnReason) {
         {{"--muxer", "mp4mux:avOptions=movflags=+faststart", "-o", "x.mp4"}, "parameter 'fastStart'"},
         {{"--vcodec", "vc3venc", "--size", "256x120", "--muxer", "mxfmux:seekable=0", "-o", "x.mxf"}, "pipe"},
         {{"--vcodec", "mpeg4venc:avOptions=threads=100000", "-o", "x.mkv"}, "own parameters decide"},
+        {{"--vcodec", "h264venc", "--crf", "-1", "-o", "x.mkv"}, "neither a quality nor a bit rate"},
     };
     for (const auto& row : rows) {
         const Outcome made = job("size=96x64", row.options);
         EXPECT_NE(made.status, 0);
         EXPECT_THAT(made.err, AllOf(HasSubstr(row.why), Not(HasSubstr("not described"))));
         EXPECT_FALSE(std::filesystem::exists(folder.file("x.mkv")));
+    }
+}
+
+// Which rates of bits there are follows from the rate of samples and the channels, not from the usual ones.
+TEST_F(FilmJobs, haveTheBitRateOfTheirSoundOrNone) {
+    const struct {
+        Words options;
+        int status, bits;
+        const char* why;
+    } rows[] = {
+        {{"--acodec", "mp2", "--samplerate", "16000", "--audio-bitrate", "320k"}, 2, 0, "8k, 16k, 24k"},
+        {{"--acodec", "mp2", "--samplerate", "16000", "--audio-bitrate", "24k"}, 0, 24000, ""},
+        {{"--acodec", "mp2:aBitrate=384", "--samplerate", "16000"}, 2, 0, "aBitrate"},
+        {{"--acodec", "aac", "--samplerate", "8000", "--audio-bitrate", "512k"}, 2, 0, "32k, 48k, 64k, 96k"},
+        {{"--acodec", "aac", "--samplerate", "8000", "--audio-bitrate", "96k"}, 0, 0, ""},
+        {{"--acodec", "aac:aBitrate=96", "--samplerate", "8000", "--channels", "1"}, 2, 0, "aBitrate"},
+    };
+    for (const auto& row : rows) {
+        Words options = row.options;
+        options.insert(options.end(), {"--no-video", "-o", "x.mkv"});
+        const Outcome made = job("size=96x64", options);
+        EXPECT_EQ(made.status, row.status) << made.err;
+        EXPECT_THAT(made.err, HasSubstr(row.why));
+        if (row.bits > 0) {
+            EXPECT_THAT(facts("x.mkv"), HasSubstr("bit_rate=" + std::to_string(row.bits)));
+        }
     }
 }
 
