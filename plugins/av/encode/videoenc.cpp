@@ -357,6 +357,11 @@ int VideoEnc::writeFrame(QvFrame* frame) {
     picture->interlaced_frame = settings_.rate.interlaced() != 0;
     picture->top_field_first = settings_.rate.isTopFirst();
     const int sent = avcodec_send_frame(context_.get(), picture);
+    // The library gives no code where what fills a constant rate up is larger than the buffer for a picture.
+    if (sent == AVERROR(EPERM) && context_->rc_min_rate > 0)
+        return setError(
+            QvStatus::failed, "Pictures of %dx%d can't be filled up to %lld kbit/s; set a lower bit rate",
+            settings_.width, settings_.height, static_cast<long long>(context_->rc_min_rate / 1000));
     if (sent < 0)
         return setError(QvStatus::failed, "The encoder refused a picture (%s)", errorText(sent).c_str());
     ++frames_;

@@ -52,10 +52,10 @@ constexpr auto containers = std::to_array<Container>({
     //   words
     //   traits
     {"mp4",          mp4Codecs,                                                    16, 32, PipeForm::fragments,
-         title | commonTags | chapters | timecode | language,
+         title | commonTags | chapters | timecode | language | creationTime | location,
          lengths | indexInFront | pixels},
     {"mov",          movCodecs,                                                    16, 32, PipeForm::fragments,
-         title | commonTags | chapters | timecode | language,
+         title | commonTags | chapters | timecode | language | creationTime | location,
          lengths | indexInFront | pixels},
     {"matroska",     everything,                                                   16, 64, PipeForm::live,
          title | commonTags | allTags | chapters | timecode | language,
@@ -64,7 +64,7 @@ constexpr auto containers = std::to_array<Container>({
          title | commonTags | allTags | chapters | language,
          lengths},
     {"mxf",          codecBits(mpeg2, h264, dnxhd, dv, jpeg2000, prores, pcm),      1, 16, PipeForm::none,
-         title | timecode,
+         title | timecode | creationTime,
          pixels | needsVideo | soundHeader, codecBit(h264)},
     {"mpegts",       codecBits(h264, hevc, mpeg1, mpeg2, mpeg4, aac, mp2, mp3, ac3, eac3, opus), 8, 32, PipeForm::same,
          title | language,

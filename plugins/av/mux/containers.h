@@ -68,7 +68,16 @@ enum class PipeForm {
 
 // What a container can say about the film.
 namespace FilmWord {
-enum : unsigned { title = 1, commonTags = 2, allTags = 4, chapters = 8, timecode = 16, language = 32 };
+enum : unsigned {
+    title = 1,
+    commonTags = 2,
+    allTags = 4,
+    chapters = 8,
+    timecode = 16,
+    language = 32,
+    creationTime = 64,
+    location = 128
+};
 }
 
 namespace MuxTrait {

@@ -125,6 +125,7 @@ TEST_F(FilmJobs, areRefusedWithTheEncodersOwnReason) {
         {{"--muxer", "mp4mux:avOptions=movflags=+faststart", "-o", "x.mp4"}, "parameter 'fastStart'"},
         {{"--vcodec", "vc3venc", "--size", "256x120", "--muxer", "mxfmux:seekable=0", "-o", "x.mxf"}, "pipe"},
         {{"--vcodec", "mpeg4venc:avOptions=threads=100000", "-o", "x.mkv"}, "own parameters decide"},
+        {{"--vcodec", "mpegvenc:vbr=0,vBitrate=50000000", "-o", "x.mkv"}, "filled up to 50000 kbit/s"},
         {{"--vcodec", "h264venc", "--crf", "-1", "-o", "x.mkv"}, "neither a quality nor a bit rate"},
     };
     for (const auto& row : rows) {
