@@ -212,12 +212,13 @@ constexpr Message kMessages[] = {
     {Msg::parameterRefused,  Exit::usage,  "{option}",                               "{name} can't take this value: {system}",                "give another value"},
     {Msg::moduleUnknown,     Exit::module, "there is no module {name}",              "this installation has none of this name and kind",      "{hint}'tarsel modules' lists all"},
     {Msg::moduleUnusable,    Exit::module, "the module {name} can't be used",        "this installation lacks what does its work",            "leave out what needs it"},
+    {Msg::moduleNotMissing,  Exit::usage,  "modules --missing {name}",               "it is not one of the modules that are missing",         "{hint}'tarsel modules --missing' lists all"},
     {Msg::muxerUnknown,      Exit::module, "--muxer",                                "there is no multiplexer {name} for this tool",          "{hint}use rawmux, rawavimux or nullmux"},
     {Msg::muxerOther,        Exit::usage,  "--muxer {text}",                         "{file} is written by {text}",                           "leave it out, or give -o or --format another format"},
     {Msg::muxerUnusable,     Exit::module, "the multiplexer {name} can't be used",   "{system}",                                              "'tarsel modules' lists what this installation has"},
     // presets
     {Msg::presetUnknown,     Exit::usage,  "there is no preset {name}",              "neither its name nor its symbol is known",              "{hint}'tarsel presets list --all' lists all"},
-    {Msg::presetWaits,       Exit::module, "the preset {name} can't be used",        "it waits for one of these modules: {text}",             "load the plug-in that has it with --plugins"},
+    {Msg::presetWaits,       Exit::module, "the preset {name} can't be used",        "it waits for one of these modules: {text}",             "load the plug-in that has it with --plugins; 'tarsel modules --missing' says why"},
     {Msg::presetBuiltin,     Exit::usage,  "the preset {name} can't be changed",     "it is built in",                                        "save one of your own with 'tarsel presets save'"},
     {Msg::presetInvalid,     Exit::module, "the preset {name} can't be used",        "{system}",                                              "'tarsel presets check' lists what is wrong with your presets"},
     {Msg::presetMuxer,       Exit::usage,  "--muxer {text}",                         "the preset {name} does not go with it",                 "use one of {text}, or leave it out"},
@@ -238,7 +239,7 @@ constexpr Message kMessages[] = {
     {Msg::presetsInvalid,    Exit::module, "not all presets of {file} can be used", "{text} of them are faulty, or need what is not installed", "load their plug-ins with --plugins, or remove them"},
     // encoders
     {Msg::codecUnknown,      Exit::module, "{option}",                               "there is no codec or encoder {name}",                   "{hint}'tarsel modules' lists the encoders"},
-    {Msg::codecMissing,      Exit::module, "{option} {name}",                        "the encoder {text} is not installed",                   "load the plug-in that has it with --plugins"},
+    {Msg::codecMissing,      Exit::module, "{option} {name}",                        "the encoder {text} is not installed",                   "load the plug-in that has it with --plugins; 'tarsel modules --missing' says why"},
     {Msg::codecNoneSet,      Exit::usage,  "{option} none",                          "what is left out has no settings",                      "leave them out, or name a codec"},
     {Msg::codecFormat,       Exit::usage,  "{option} {name}",                        "{file} holds {text}",                                   "give the output another extension, or leave the option out"},
     {Msg::codecMuxer,        Exit::usage,  "{option} {name}",                        "{text}, which writes {file}, does not take it",         "give the output another extension, or use one of: {text}"},

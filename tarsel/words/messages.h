@@ -212,6 +212,7 @@ enum class Msg : unsigned short {
     parameterRefused,
     moduleUnknown,
     moduleUnusable,
+    moduleNotMissing,
     muxerUnknown,
     muxerOther,
     muxerUnusable,

@@ -162,4 +162,19 @@ TEST_F(FilmJobs, haveTheBitRateOfTheirSoundOrNone) {
     }
 }
 
+// Why there is no VC-1, and what is known without a plug-in.
+TEST_F(FilmJobs, haveAReasonForEachModuleThatIsMissing) {
+    const std::string all = tarsel({"modules", "--missing"}).out;
+    EXPECT_THAT(all, AllOf(HasSubstr("\namraenc         audio encoder  libavcodec is packaged without"),
+                           HasSubstr("\nasfmux          multiplexer "), Not(HasSubstr("no plug-in"))));
+    const std::string present = tarsel({"modules"}).out;
+    std::istringstream lines(all);
+    for (std::string line; std::getline(lines, line);)
+        EXPECT_THAT("\n" + present, Not(HasSubstr("\n" + line.substr(0, line.find(' ')) + " "))) << line;
+    EXPECT_THAT(tarsel({"modules", "--missing", "vc1venc", "--json"}).out,
+                AllOf(HasSubstr("\"name\": \"vc1venc\""), HasSubstr("\"reason\": \"libavcodec reads VC-1")));
+    EXPECT_THAT(tarsel({"--no-plugins", "modules", "--missing", "h264venc"}).out, HasSubstr("no plug-in"));
+    EXPECT_EQ(tarsel({"modules", "--missing", "rawvenc"}).status, 2);
+}
+
 }  // namespace
