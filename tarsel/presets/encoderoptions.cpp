@@ -126,6 +126,10 @@ void setEncoder(QvEncoder& encoder, int type, const EncoderOptions& options, con
     const bool video = type == qvVideoStream;
     if (isRawEncoder(encoder) && first != (video ? "--vcodec" : "--acodec"))
         throw failure(Msg::encoderRaw, {first, output});
+    // It decides what the others may be.
+    for (const auto& [key, value] : options.video)
+        if (video && key == "standard")
+            setGuessed(encoder, key, value, std::string("--vcodec ") + encoder.name());
     if (video && !options.crf.empty()) setGuessed(encoder, "crf", options.crf, "--crf");
     if (video && !options.bitrate.empty()) setBitrate(encoder, type, options.bitrate, "--bitrate");
     for (const auto& [key, value] : video ? options.video : options.audio)

@@ -145,6 +145,9 @@ std::string VideoEnc::prepare() {
         return "Sides of pictures are " + std::to_string(least) + " to " + std::to_string(codec.most) +
                " pixels" + (codec.step > 1 ? ", multiples of " + std::to_string(codec.step) : "") + ", not " +
                std::to_string(s.width) + "x" + std::to_string(s.height);
+    if (!s.takesSize())
+        return "H.263 has pictures of 128x96, 176x144, 352x288, 704x576 and 1408x1152, not of " +
+               std::to_string(s.width) + "x" + std::to_string(s.height);
     if (s.codesFields() && !s.takesFields())
         return "The codec takes two fields a picture in 4:2:2 of 1920x1080 only";
     if (s.twoPass && !s.passes) return "There are no statistics of a first pass";
@@ -248,6 +251,12 @@ std::string VideoEnc::configureRate() {
             c.gop_size = s.codec->has(VideoTrait::setsFirst) && s.codec->has(VideoTrait::statsFile) ? 1 : 0;
         if (s.n > 1 && s.codec->has(VideoTrait::statsText)) c.flags |= AV_CODEC_FLAG_CLOSED_GOP;
         if (s.m > 1 && is(*s.codec, "h264venc")) av_opt_set(&c, "forced-idr", "1", AV_OPT_SEARCH_CHILDREN);
+    }
+    if (!s.timecode.empty() && is(*s.codec, "mpegvenc")) {
+        std::string timecode = s.timecode;
+        // The library drops numbers at this rate only.
+        if (c.framerate.num != 30000) std::replace(timecode.begin(), timecode.end(), ';', ':');
+        av_opt_set(&c, "gop_timecode", timecode.c_str(), AV_OPT_SEARCH_CHILDREN);
     }
     // Which of the tables of DNxHD it is: that of its highest quality.
     if (s.codesFields() && is(*s.codec, "vc3venc")) c.bit_rate = s.rate.rate().ratio() > 26 ? 220e6 : 185e6;

@@ -22,6 +22,7 @@ constexpr auto codecRows = std::to_array<MuxCodecRow>({
     {mpeg1,    AV_CODEC_ID_MPEG1VIDEO, "MPEG-1",    "MPG1,MP1V,MPEG",           true},
     {mpeg2,    AV_CODEC_ID_MPEG2VIDEO, "MPEG-2",    "MPG2,MP2V,M2V ",           true},
     {mpeg4,    AV_CODEC_ID_MPEG4,      "MPEG-4",    "MP4V,FMP4,MPG4",           true},
+    {h263,     AV_CODEC_ID_H263,       "H.263",     "H263,S263",                false},
     {dnxhd,    AV_CODEC_ID_DNXHD,      "DNxHD",     "AVDN,VC3 ,VC-3,DNXH,AVDH", false},
     {dv,       AV_CODEC_ID_DVVIDEO,    "DV",        "DV  ,DVSD,DV25,DV50,DVH1,DV1H,DVCP", false},
     {jpeg2000, AV_CODEC_ID_JPEG2000,   "JPEG 2000", "MJ2K,MJP2,JP2K,J2K ,MJ2 ", false},
@@ -43,8 +44,8 @@ static_assert(codecRows.size() == static_cast<std::size_t>(MuxCodec::count));
 
 constexpr std::uint32_t everySound = codecBits(aac, mp2, mp3, ac3, eac3, flac, opus, vorbis, pcm);
 constexpr std::uint32_t everything = (1u << static_cast<int>(MuxCodec::count)) - 1;
-constexpr std::uint32_t mp4Codecs = codecBits(h264, hevc, av1, vp9, mpeg1, mpeg2, mpeg4, mjpeg, jpeg2000, aac, mp3, ac3, eac3, flac, opus, vorbis, pcm);
-constexpr std::uint32_t movCodecs = codecBits(h264, hevc, mpeg2, mpeg4, dnxhd, dv, jpeg2000, prores, mjpeg, raw, aac, mp3, ac3, eac3, pcm);
+constexpr std::uint32_t mp4Codecs = codecBits(h264, hevc, av1, vp9, mpeg1, mpeg2, mpeg4, h263, mjpeg, jpeg2000, aac, mp3, ac3, eac3, flac, opus, vorbis, pcm);
+constexpr std::uint32_t movCodecs = codecBits(h264, hevc, mpeg2, mpeg4, h263, dnxhd, dv, jpeg2000, prores, mjpeg, raw, aac, mp3, ac3, eac3, pcm);
 
 // In the order of muxerModules.
 constexpr auto containers = std::to_array<Container>({
@@ -75,7 +76,7 @@ constexpr auto containers = std::to_array<Container>({
     {"dv",           codecBits(dv, pcm),                                            1, 4,  PipeForm::same,
          timecode,
          counted | needsVideo | pixels, 0, "rawvideo"},
-    {"avi",          codecBits(dv, mpeg4, mjpeg, ffv1, raw, mp2, mp3, ac3, pcm),    8, 32, PipeForm::none,
+    {"avi",          codecBits(dv, mpeg4, h263, mjpeg, ffv1, raw, mp2, mp3, ac3, pcm),    8, 32, PipeForm::none,
          title | commonTags | language,
          adts | counted, codecBit(mpeg4)},
     {"yuv4mpegpipe", codecBits(raw),                                                1, 0,  PipeForm::same,

@@ -19,6 +19,7 @@ enum class MuxCodec {
     mpeg1,
     mpeg2,
     mpeg4,
+    h263,
     dnxhd,
     dv,
     jpeg2000,

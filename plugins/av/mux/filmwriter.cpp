@@ -108,6 +108,12 @@ void FilmWriter::chooseFormat() {
                           job_.name.c_str());
         job_.format = "mov";
     }
+    // Its own box is that of 3GP, which is otherwise the same.
+    const auto isNoH263 = [](const MuxTrack& track) { return track.codec().codec != MuxCodec::h263; };
+    if (job_.format == std::string_view("mp4") && !all(isNoH263)) {
+        qv_log()->warning("'%s' has the form of 3GP, as MP4 has no word for H.263", job_.name.c_str());
+        job_.format = "3gp";
+    }
     if (job_.container->silent && all(std::mem_fn(&MuxTrack::video))) job_.format = job_.container->silent;
     if (job_.container->mpeg1 && all(old)) job_.format = job_.container->mpeg1;
 }
@@ -117,6 +123,15 @@ bool FilmWriter::canJoin() {
     if (job_.format != std::string_view("dv") || tracks_.front().parameters().height != 720) return true;
     return fail(std::string(job_.container->module().displayName) +
                 " does not hold DVCPRO HD of 720 lines with sound, but AVI and MXF do");
+}
+
+// The library writes every picture of JPEG 2000 as a whole one.
+bool FilmWriter::losesFields() const {
+    return job_.format == std::string_view("mxf") &&
+           std::any_of(tracks_.begin(), tracks_.end(), [](const MuxTrack& track) {
+               return track.codec().codec == MuxCodec::jpeg2000 &&
+                      track.parameters().field_order > AV_FIELD_PROGRESSIVE;
+           });
 }
 
 bool FilmWriter::begin() {
@@ -134,7 +149,8 @@ bool FilmWriter::begin() {
     made->strict_std_compliance = FF_COMPLIANCE_EXPERIMENTAL;
     for (MuxTrack& track : tracks_)
         if (!addStream(track)) return failWith("a stream could not be made", AVERROR(ENOMEM));
-    const std::string lost = setFilmWords(*made, *job_.container, job_.meta, seconds(), startTime());
+    std::string lost = setFilmWords(*made, *job_.container, job_.meta, seconds(), startTime());
+    if (losesFields()) lost += (lost.empty() ? "" : ", ") + std::string("the order of its fields");
     if (!lost.empty()) qv_log()->warning("'%s' does not hold: %s", job_.name.c_str(), lost.c_str());
     AVDictionary* options = nullptr;
     setOptions(&options);

@@ -80,6 +80,7 @@ class FilmWriter {
     bool beginIfReady();
     void chooseFormat();
     bool canJoin();
+    bool losesFields() const;
     bool begin();
     bool addStream(MuxTrack& track);
     void setOptions(AVDictionary** options);

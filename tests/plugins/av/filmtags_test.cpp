@@ -66,8 +66,11 @@ TEST_F(FilmTags, haveTimeAndPlaceOfTheirPictures) {
                          "--meta", "album=Al"};
     const struct {
         const char *name, *lost;
-    } rows[] = {
-        {"x.mp4", ""}, {"x.mov", ""}, {"x.mkv", ""}, {"x.m4a", ""}, {"x.mxf", "album, chapters, comment, location"}};
+    } rows[] = {{"x.mp4", ""},
+                {"x.mov", ""},
+                {"x.mkv", ""},
+                {"x.m4a", ""},
+                {"x.mxf", "album, chapters, comment, location"}};
     for (const auto& row : rows) {
         Words all = {"transcode", "a.mkv", "-y", "-o", row.name};
         all.insert(all.end(), words.begin(), words.end());
@@ -122,6 +125,12 @@ TEST_F(FilmTags, moveWithACut) {
         AllOf(HasSubstr("timecode  10:00:01:05\n"), HasSubstr(first + "Two\n"), Not(HasSubstr("One"))));
     EXPECT_THAT(made({"a.mkv", "--from", "0.4", "--rate", "50", "-o", "x.mkv"}),
                 HasSubstr("timecode  10:00:00:20\n"));
+    // Each group of MPEG-2 has a timecode of its own.
+    made({"a.mkv", "--from", "0.4", "--vcodec", "mpeg2", "--no-audio", "-o", "x.m2v"});
+    EXPECT_THAT(runProgram({"/usr/bin/env", "ffprobe", "-v", "error", "-show_frames", "-show_entries",
+                            "frame_tags=timecode", folder.file("x.m2v")})
+                    .out,
+                AllOf(HasSubstr("timecode=10:00:00:10"), HasSubstr("timecode=10:00:00:20")));
     // A cut within a chapter makes none.
     EXPECT_THAT(made({"a.mkv", "--cut", "0-0.2", "--cut", "0.6-0.8", "--cut", "1.8-2", "-o", "x.mkv"}),
                 AllOf(HasSubstr(first + "One\n  chapter   0:00:00.400, Two\n"), HasSubstr("title     A\n")));

@@ -44,6 +44,9 @@ TEST_F(FilmJobs, areWhatTheirOptionsSay) {
          "codec_name=hevc"},
         {"g.mkv", "size=1280x720", {"--vcodec", "h265venc:preset=ultrafast,threads=40"}, "codec_name=hevc"},
         {"e.mxf", "size=1920x1080", {"--vcodec", "vc3venc", "--rate", "25i"}, "field_order=tt"},
+        {"h.mov", "size=720x576", {"--vcodec", "jpeg2000", "--rate", "25i"}, "field_order=tt"},
+        {"j.mkv", "size=320x240", {"--vcodec", "mpeg1"}, "codec_name=mpeg1video"},
+        {"i.avi", "size=352x288", {"--vcodec", "h263"}, "codec_name=h263"},
         {"f.mp4",
          "size=96x64",
          {"--vcodec", "h264venc:codecProfile=baseline", "--muxer",
@@ -126,6 +129,8 @@ TEST_F(FilmJobs, areRefusedWithTheEncodersOwnReason) {
         {{"--vcodec", "vc3venc", "--size", "256x120", "--muxer", "mxfmux:seekable=0", "-o", "x.mxf"}, "pipe"},
         {{"--vcodec", "mpeg4venc:avOptions=threads=100000", "-o", "x.mkv"}, "own parameters decide"},
         {{"--vcodec", "mpegvenc:vbr=0,vBitrate=50000000", "-o", "x.mkv"}, "filled up to 50000 kbit/s"},
+        {{"--vcodec", "mpeg4venc:standard=H.263", "-o", "x.mkv"}, "takes 128x96, 176x144"},
+        {{"--vcodec", "h263", "--size", "176x144", "-o", "x.ts"}, "does not"},
         {{"--vcodec", "h264venc", "--crf", "-1", "-o", "x.mkv"}, "neither a quality nor a bit rate"},
     };
     for (const auto& row : rows) {
