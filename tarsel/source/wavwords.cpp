@@ -24,8 +24,8 @@ const char* keyOf(const std::string& id) {
 
 bool isInfo(const Any& chunk) {
     const Any& data = chunk.isDict() ? chunk.asDict().get("data") : Any();
-    return chunk.isDict() && chunk.asDict().get("id") == "LIST" && data.isGeneric() &&
-           data.size() >= 4 && std::string(static_cast<const char*>(data.asGeneric()), 4) == "INFO";
+    return chunk.isDict() && chunk.asDict().get("id") == "LIST" && data.isGeneric() && data.size() >= 4 &&
+           std::string(static_cast<const char*>(data.asGeneric()), 4) == "INFO";
 }
 
 // What the chunks say, in their order: calls visit(id, text).
