@@ -154,7 +154,11 @@ int setStandard(S& s, const Any& value) {
     const VideoCodec* const row =
         wanted.empty() ? videoCodec(s.codec->module) : videoCodec(s.codec->module, wanted.c_str());
     if (!row) return QvStatus::invalidParam;
+    if (row == s.codec) return QvStatus::ok;
     s.codec = row;
+    // Those of the other one mean nothing here.
+    s.codecProfile = row->profile;
+    s.profileOptions.clear();
     s.m = std::min(s.m, row->mostM);
     if (!row->has(VideoTrait::interlaced)) s.rate.setInterlaced(0);
     if (s.target > 0) s.target = std::clamp(s.target, row->lowBits, row->highBits);
@@ -234,11 +238,6 @@ void fixed(const S&, Any& value) {
 
 using C = const S&;
 const Row commonRows[] = {
-    {.name = "standard",
-     .member = Access{setStandard, [](C s, Any& v) { v = s.codec->standard; }},
-     .flags = qvParamStored,
-     .help = "MPEG-2 or MPEG-1, MPEG-4 or H.263, of an encoder of both",
-     .type = Any::String},
     {.name = "profile",
      .member = Access{setProfile, [](C s, Any& v) { v = s.profile; }},
      .flags = qvParamStored,
@@ -249,6 +248,12 @@ const Row commonRows[] = {
      .flags = qvParamStored,
      .help = "1: size and rate of a preset for television are those of 50 Hz",
      .type = Any::Int32},
+    // After the rows of presets, which have one of their own.
+    {.name = "standard",
+     .member = Access{setStandard, [](C s, Any& v) { v = s.codec->standard; }},
+     .flags = qvParamStored,
+     .help = "MPEG-2 or MPEG-1, MPEG-4 or H.263, of an encoder of both",
+     .type = Any::String},
     {"width", &S::width, qvParamStored, 0, 16384, "", "pixels", "0: not set"},
     {"height", &S::height, qvParamStored, 0, 16384, "", "pixels", "0: not set"},
     {.name = "framerate",
