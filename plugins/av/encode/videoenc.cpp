@@ -234,9 +234,20 @@ std::string VideoEnc::describeCodec() {
     if (!set(s.codec->tune, s.tune)) return "There is no tune '" + s.tune + "'";
     if (is(*s.codec, "dvvenc") || is(*s.codec, "dv100venc")) return "";
     const VideoForm& form = *s.codec->form(s.type);
-    const std::string profile = s.codesFields() && is(*s.codec, "vc3venc") ? "dnxhd"
-                                : form.profile                             ? form.profile
-                                                                           : s.codecProfile;
+    std::string profile = s.codesFields() && is(*s.codec, "vc3venc") ? "dnxhd"
+                          : form.profile                             ? form.profile
+                                                                     : s.codecProfile;
+    // The library writes to the standard error about profiles that do not go with the rest.
+    if (is(*s.codec, "h264venc")) {
+        const bool lossless =
+            s.byQuality() && s.quality < 1 && s.type != QvFourcc::W016 && s.type != QvFourcc::Y216;
+        if (lossless && form.profile) profile = "high444";
+        if (lossless && !profile.empty() && profile != "high444")
+            return "The profile '" + profile + "' has no lossless pictures, which crf " +
+                   std::to_string(s.quality) + " asks for";
+        if (profile == "baseline" && s.codesFields())
+            return "The profile 'baseline' has no interlaced pictures";
+    }
     if (!set("profile", profile)) return "There is no profile '" + profile + "'";
     return "";
 }
@@ -270,14 +281,18 @@ std::string VideoEnc::configureRate() {
     c.bit_rate = static_cast<std::int64_t>(target);
     const bool constant = s.vbr == QvBitrate::cbr;
     const double most = constant ? target : s.most > target ? s.most : 0;
-    if (most > 0 && !is(*s.codec, "av1venc")) {
+    const bool av1 = is(*s.codec, "av1venc");
+    if (av1 && !constant && most > 0)
+        qv_log()->warning("%s has no highest bit rate; only the average of %lld kbit/s is kept", name(),
+                          static_cast<long long>(c.bit_rate / 1000));
+    if (most > 0 && (constant || !av1)) {
         c.rc_max_rate = static_cast<std::int64_t>(most);
         // The models of MPEG-2 at main and high level; the others get a second.
         const bool mpeg = is(*s.codec, "mpegvenc");
         const double buffer = !mpeg ? most : most <= 15e6 ? 1835008 : 9781248;
         c.rc_buffer_size = static_cast<int>(std::min(buffer, 2e9));
     }
-    if (constant && is(*s.codec, "mpegvenc")) c.rc_min_rate = c.rc_max_rate;
+    if (constant && (av1 || is(*s.codec, "mpegvenc"))) c.rc_min_rate = c.rc_max_rate;
     // The others fill no stream up.
     const bool fills = is(*s.codec, "mpegvenc") || is(*s.codec, "mpeg4venc");
     if (!constant && fills && most > 0) c.rc_min_rate = static_cast<std::int64_t>(std::min(s.least, target));

@@ -363,6 +363,7 @@ const Row rateRows[] = {
      .member = Access{[](S& s, const Any& value) { return setBits(s, value, &S::most); },
                       [](C s, Any& v) { v = s.most > 0 ? s.most : nominalBits(s); }},
      .unit = "bit/s",
+     .help = "AV1 has none",
      .type = Any::Float},
     {"minVBitrate", &S::least, qvParamStored, 0, 4e9, "", "bit/s",
      "MPEG-1, 2 and 4 with a maximum; the others do not fill up"},

@@ -128,6 +128,8 @@ std::uint32_t muxFourcc(AVCodecID id) {
 
 const MuxCodecRow& muxCodecRow(MuxCodec codec) { return codecRows[static_cast<std::size_t>(codec)]; }
 
+bool isSound(MuxCodec codec) { return (everySound & codecBit(codec)) != 0; }
+
 const MuxerModule& Container::module() const {
     return muxerModules[static_cast<std::size_t>(this - containers.data())];
 }
@@ -135,7 +137,7 @@ const MuxerModule& Container::module() const {
 std::string Container::takenNames(bool video) const {
     std::vector<std::string> names;
     for (const MuxCodecRow& row : codecRows)
-        if (takes(row.codec) && ((everySound & codecBit(row.codec)) == 0) == video) names.push_back(row.name);
+        if (takes(row.codec) && isSound(row.codec) != video) names.push_back(row.name);
     std::string all;
     for (std::size_t i = 0; i < names.size(); ++i)
         all += (i == 0 ? "" : i + 1 == names.size() ? " and " : ", ") + names[i];

@@ -50,6 +50,7 @@ struct MuxCodecRow {
 // Null for a FOURCC that no codec has.
 const MuxCodecRow* muxCodec(std::uint32_t fourcc);
 const MuxCodecRow& muxCodecRow(MuxCodec codec);
+bool isSound(MuxCodec codec);
 std::uint32_t muxFourcc(AVCodecID id);  // for a head; 0 for what no codec is
 
 constexpr std::uint32_t codecBit(MuxCodec codec) { return 1u << static_cast<int>(codec); }

@@ -16,6 +16,8 @@ namespace av {
 
 namespace {
 
+constexpr std::int64_t mostWaiting = std::int64_t{1} << 30;  // bytes of units before the header is written
+
 int openNothing(AVFormatContext*, AVIOContext**, const char*, int, AVDictionary**) { return AVERROR(EPERM); }
 
 // Two of the codes of ISO 639-2 stand for one language. QuickTime's list has the older ones.
@@ -69,10 +71,18 @@ bool FilmWriter::unit(std::size_t track, PacketPtr unit) {
 bool FilmWriter::putMade(std::size_t track) {
     bool ok = true;
     for (PacketPtr& unit : made_) {
-        if (!begun_)
-            waiting_.push_back({track, std::move(unit)});
-        else
+        if (begun_) {
             ok = ok && put(track, *unit);
+            continue;
+        }
+        waitingBytes_ += unit->size;
+        waiting_.push_back({track, std::move(unit)});
+    }
+    if (waitingBytes_ > mostWaiting) {
+        const auto late = std::find_if(tracks_.begin(), tracks_.end(),
+                                       [](const MuxTrack& other) { return !other.ready(); });
+        if (late != tracks_.end())
+            return fail(late->place() + ": nothing has come of it, and the others can't wait any longer");
     }
     made_.clear();
     return ok;
@@ -162,6 +172,7 @@ bool FilmWriter::begin() {
     for (Waiting& first : waiting_) ok = ok && put(first.track, *first.unit);
     waiting_.clear();
     waiting_.shrink_to_fit();
+    waitingBytes_ = 0;
     return ok;
 }
 
@@ -226,8 +237,11 @@ void FilmWriter::setOptions(AVDictionary** options) {
     const Container& container = *job_.container;
     if (container.is(MuxTrait::indexInFront)) {
         const bool pipe = !job_.seekable;
-        av_dict_set(options, "movflags",
-                    pipe ? "+write_colr+frag_keyframe+delay_moov+default_base_moof" : "+write_colr", 0);
+        // Only a header that waits for the first units can say when the streams start.
+        const char* const flags = pipe ? "+write_colr+frag_keyframe+delay_moov+default_base_moof"
+                                  : makesFragments(job_.options) ? "+write_colr+delay_moov+default_base_moof"
+                                                                 : "+write_colr";
+        av_dict_set(options, "movflags", flags, 0);
         if (pipe) {
             av_dict_set(options, "min_frag_duration", "1000000", 0);
             av_dict_set(options, "frag_duration", "10000000", 0);
@@ -249,8 +263,13 @@ void FilmWriter::setOptions(AVDictionary** options) {
     AVDictionary* own = nullptr;
     parseMuxOptions(job_.options, job_.format, &own);
     const AVDictionaryEntry* entry = nullptr;
-    while ((entry = av_dict_get(own, "", entry, AV_DICT_IGNORE_SUFFIX)))
-        av_dict_set(options, entry->key, entry->value, *entry->value == '+' ? AV_DICT_APPEND : 0);
+    while ((entry = av_dict_get(own, "", entry, AV_DICT_IGNORE_SUFFIX))) {
+        // Flags come on top of those that the film needs.
+        const bool flags = std::strcmp(entry->key, "movflags") == 0;
+        const bool listed = *entry->value == '+' || *entry->value == '-';
+        const std::string value = (flags && !listed ? "+" : "") + std::string(entry->value);
+        av_dict_set(options, entry->key, value.c_str(), flags || *entry->value == '+' ? AV_DICT_APPEND : 0);
+    }
     av_dict_free(&own);
 }
 

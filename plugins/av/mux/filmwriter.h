@@ -71,6 +71,7 @@ class FilmWriter {
     std::vector<long long> written_;
     std::unique_ptr<AVFormatContext, Free> film_;
     std::vector<Waiting> waiting_;
+    std::int64_t waitingBytes_ = 0;
     std::vector<PacketPtr> made_;
     bool begun_ = false;
     bool spaceKept_ = false;

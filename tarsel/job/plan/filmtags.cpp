@@ -238,7 +238,7 @@ void checkTags(const OutputForm& output, const TagOptions& options) {
     if (output.kind == OutputKind::wav && !output.isStream() && options.languages.empty()) {
         for (const std::string& word : options.given)
             if (const std::string key = word.substr(0, word.find('=')); isKey(key) && !isWavWord(key))
-                throw failure(Msg::metaNoRoom, {option + " " + key, output.name});
+                throw failure(Msg::metaNoRoom, {"--meta " + key, output.name});
         return;
     }
     if (!option.empty() && output.kind != OutputKind::module && output.kind != OutputKind::nothing)

@@ -131,6 +131,8 @@ TEST_F(FilmJobs, areRefusedWithTheEncodersOwnReason) {
         {{"--vcodec", "mpegvenc:vbr=0,vBitrate=50000000", "-o", "x.mkv"}, "filled up to 50000 kbit/s"},
         {{"--vcodec", "mpeg4venc:standard=H.263", "-o", "x.mkv"}, "takes 128x96, 176x144"},
         {{"--vcodec", "h263", "--size", "176x144", "-o", "x.ts"}, "does not"},
+        {{"--vcodec", "h264venc:codecProfile=high", "--crf", "0", "-o", "x.mkv"}, "no lossless"},
+        {{"--vcodec", "h264venc:codecProfile=baseline", "--rate", "25i", "-o", "x.mkv"}, "no interlaced"},
         {{"--vcodec", "h264venc", "--crf", "-1", "-o", "x.mkv"}, "neither a quality nor a bit rate"},
     };
     for (const auto& row : rows) {
@@ -139,6 +141,19 @@ TEST_F(FilmJobs, areRefusedWithTheEncodersOwnReason) {
         EXPECT_THAT(made.err, AllOf(HasSubstr(row.why), Not(HasSubstr("not described"))));
         EXPECT_FALSE(std::filesystem::exists(folder.file("x.mkv")));
     }
+}
+
+// Sound and pictures of a film in fragments begin together, and all of its units are counted.
+TEST_F(FilmJobs, beginTogetherInFragments) {
+    for (const char* options :
+         {"frag_duration=100000", "movflags=frag_keyframe", "movflags=+frag_every_frame"})
+        for (const auto& [name, muxer] : {std::pair("x.mp4", "mp4mux"), std::pair("x.mov", "movmux")}) {
+            SCOPED_TRACE(std::string(options) + name);
+            const Outcome made =
+                job("size=96x64", {"--muxer", std::string(muxer) + ":avOptions=" + options, "-o", name});
+            EXPECT_EQ(made.status, 0) << made.err;
+            EXPECT_THAT(facts(name), AllOf(HasSubstr("start_time=0.000000"), HasSubstr("start_time=-0.02")));
+        }
 }
 
 // Which rates of bits there are follows from the rate of samples and the channels, not from the usual ones.
