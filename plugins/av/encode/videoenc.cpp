@@ -304,8 +304,11 @@ std::string VideoEnc::configurePass() {
     AVCodecContext& c = *context_;
     const bool x265 = is(*s.codec, "h265venc");
     std::string own = x265 ? "log-level=none:open-gop=0" : "";
-    // Its own pool has a thread a core otherwise.
-    if (x265 && s.threads > 0) own += ":pools=" + std::to_string(s.threads);
+    // Its own pool has a thread a core otherwise, and more pictures at a time where there are more cores.
+    if (x265 && s.threads > 0) {
+        const int pictures = s.threads >= 16 ? 4 : s.threads >= 8 ? 3 : s.threads >= 4 ? 2 : 1;
+        own += ":pools=" + std::to_string(s.threads) + ":frame-threads=" + std::to_string(pictures);
+    }
     if (s.passes && s.codec->has(VideoTrait::statsText | VideoTrait::statsFile)) {
         c.flags |= s.firstPass ? AV_CODEC_FLAG_PASS1 : AV_CODEC_FLAG_PASS2;
         if (s.codec->has(VideoTrait::statsFile)) {
