@@ -1,6 +1,9 @@
 // The modules of this installation and their parameters.
+#include <set>
 #include "tarsel/commands/commands.h"
+
 #include "tarsel/host/console.h"
+#include "tarsel/presets/codecnames.h"
 #include "tarsel/source/source.h"
 #include "tarsel/words/commandline.h"
 #include "tarsel/words/json.h"
@@ -97,8 +100,77 @@ void printParameters(const Json& module) {
 
 struct Given {
     std::string name;
-    bool json = false;
+    bool json = false, missing = false;
 };
+
+// The modules that presets and options know by name, and that are not there or can't do their work, each with
+// the reason.
+class MissingModules {
+  public:
+    MissingModules() {
+        for (int i = 0; i < qv_registry()->nrModules(0); ++i) {
+            QvModule& module = *qv_registry()->module(i);
+            installed_.insert(module.name());
+            const std::unique_ptr<QvCodec> codec(qv_registry()->newCodec(module.name()));
+            if (!codec)
+                add(module.name(), moduleKind(module),
+                    "the libraries that are installed lack what does its work",
+                    module.plugin() ? module.plugin()->name().asString("") : "");
+        }
+        for (int i = 0; i < qv_registry()->nrPlugins(); ++i) takeFrom(*qv_registry()->plugin(i));
+        const AnyVector presets = qvPresetMgr()->missingPresets();
+        for (const Any& preset : presets)
+            for (const Any& name : preset.asDict().getVector("waitsFor", AnyVector()))
+                noPlugin(name.asString(""), QvModuleType::videoEncoder);
+        for (const CodecName& codec : codecNames())
+            for (const char* const name : codec.encoders())
+                noPlugin(name, codec.type == qvVideoStream ? QvModuleType::videoEncoder
+                                                           : QvModuleType::audioEncoder);
+    }
+    const Json& rows() const { return rows_; }
+
+  private:
+    Json rows_ = Json::array();
+    std::set<std::string> installed_, listed_;
+
+    void add(const std::string& name, int kind, const std::string& reason, const std::string& plugin) {
+        if (name.empty() || !listed_.insert(name).second) return;
+        rows_.push_back({{"name", name}, {"kind", kindName(kind)}, {"reason", reason}, {"plugin", plugin}});
+    }
+    void noPlugin(const std::string& name, int kind) {
+        const bool mux = name.size() > 3 && name.compare(name.size() - 3, 3, "mux") == 0;
+        if (mux) kind = QvModuleType::muxer;
+        if (installed_.count(name) == 0) add(name, kind, "no plug-in that is loaded has it", "");
+    }
+    // What a plug-in says of modules that it leaves out.
+    void takeFrom(const QvPlugin& plugin) {
+        const Any all = plugin.getAttr("missing");
+        if (!all.isVector()) return;
+        for (const Any& entry : all.asVector()) {
+            if (!entry.isDict()) continue;
+            const AnyDict& row = entry.asDict();
+            const std::string name = row.getString("name", ""), reason = row.getString("reason", "");
+            if (installed_.count(name) == 0)
+                add(name, row.getInt32("type", 0), reason, plugin.name().asString(""));
+        }
+    }
+};
+
+void listMissing(const Given& given) {
+    Json rows = Json::array();
+    const Json all = MissingModules().rows();
+    std::vector<std::string> names;
+    for (const auto& row : all) {
+        names.push_back(text(row, "name"));
+        if (given.name.empty() || given.name == names.back()) rows.push_back(row);
+    }
+    if (rows.empty() && !given.name.empty())
+        throw failure(Msg::moduleNotMissing, {given.name, suggestion(given.name, names)});
+    if (given.json) return print("%s\n", rows.dump(2).c_str());
+    for (const auto& row : rows)
+        print("%-15s %-14s %s\n", text(row, "name").c_str(), text(row, "kind").c_str(),
+              text(row, "reason").c_str());
+}
 
 void list(const Given& given) {
     Json all = Json::array();
@@ -123,5 +195,6 @@ void addModules(CommandLine& line) {
     auto given = std::make_shared<Given>();
     command.argument("NAME", given->name, "A module", Need::optional);
     command.flag("--json", given->json, "Print JSON, with the parameters of each");
-    command.action([given] { list(*given); });
+    command.flag("--missing", given->missing, "List those that are known and not there, and why");
+    command.action([given] { given->missing ? listMissing(*given) : list(*given); });
 }

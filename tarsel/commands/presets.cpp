@@ -149,6 +149,7 @@ QvPreset presetOf(const Given& given, const std::string& name) {
         QvEncoder& encoder = base.addStream(*pipe, type);
         set(given, encoder);
         setEncoder(encoder, type, encoders, name);
+        type == qvVideoStream ? checkQuality(encoder) : setSoundRate(encoder, encoders);
     };
     add(qvVideoStream, given.noVideo || wish.video.none, setPicture);
     add(qvAudioStream, given.noAudio || wish.audio.none, setSound);

@@ -51,8 +51,8 @@ void countClipping(const JobParts& parts) {
     }
 }
 
-// Only a WAV file has room for them. A stream ends with its samples, and not every reader of a pipe knows
-// RF64.
+// The words of the output are those of the input of its first stream. Only a WAV file has room for them. A
+// stream ends with its samples, and not every reader of a pipe knows RF64.
 void carryChunks(const JobParts& parts, Warnings& warnings) {
     const JobPlan& plan = parts.plan;
     if (plan.output.writesNothing()) return;
@@ -61,7 +61,9 @@ void carryChunks(const JobParts& parts, Warnings& warnings) {
         if (stream.isVideo()) continue;
         QvBufStream* const file = isWav ? parts.file(stream) : nullptr;
         if (file) file->setParam("rf64", 1);
-        const WavPart part = partOf(plan, stream);
+        WavPart part = partOf(plan, stream);
+        part.isFilm = plan.output.kind == OutputKind::module;
+        if (plan.tags && stream.part.input == plan.streams.front().part.input) part.words = &*plan.tags;
         if (plan.input(stream).joined) nameLostOfJoined(parts, part, warnings);
         const std::string lost = carryWavChunks(parts.source(stream), stream.part.stream, part, file);
         if (!lost.empty()) warnings.add(lineOf(Msg::inputChunksLost, {plan.input(stream).name, lost}));

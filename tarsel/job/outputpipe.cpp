@@ -60,6 +60,10 @@ void setTags(QvEncodePipe& pipe, const JobPlan& plan) {
     if (plan.output.kind != OutputKind::module) return;
     QvMuxer& muxer = *pipe.getMuxer();
     if (plan.tags) setOptional(muxer, "tags", Any(*plan.tags));
+    const Any timecode = plan.tags ? plan.tags->get("timecode").toString() : Any();
+    for (const PlannedStream& stream : plan.streams)
+        if (stream.isVideo() && timecode.isString())
+            setOptional(*pipe.encoder(stream.type, stream.number), "timecode", timecode);
     for (const PlannedStream& stream : plan.streams)
         for (const auto& [name, text] :
              {std::pair{"language", &stream.language}, std::pair{"title", &stream.title}})

@@ -12,6 +12,8 @@ struct CodecName {
     int type;                      // qvVideoStream or qvAudioStream
     const char* modules[most];     // encoders, the preferred one first; null for none
     const char* preset = nullptr;  // symbol of the one that asks its encoder for this codec; null for none
+    // Of an encoder of several codecs: the value of its parameter "standard"; null for its usual one.
+    const char* standard = nullptr;
 
     std::span<const char* const> encoders() const;
 };

@@ -1,6 +1,7 @@
 #include "tarsel/presets/codecwords.h"
 
 #include <algorithm>
+#include <memory>
 
 #include <qvplugcore/qvplugcore.h>
 
@@ -25,6 +26,15 @@ bool isKnownModule(const std::string& name, int type) {
     });
 }
 
+bool hasStandards(const std::string& module) {
+    const std::unique_ptr<QvCodec> codec(qv_registry()->newCodec(module.c_str()));
+    try {
+        return codec && static_cast<const QvCodec&>(*codec).getParam("standard").isText();
+    } catch (const QvParamException&) {  // not one of its parameters
+        return false;
+    }
+}
+
 void takeModules(CodecWords& words) {
     if (isEncoder(words.name.c_str(), words.type)) {
         words.modules = {words.name};
@@ -41,6 +51,8 @@ void takeModules(CodecWords& words) {
         if (isEncoder(module, words.type)) words.modules.emplace_back(module);
     if (words.modules.empty()) throw failure(Msg::codecMissing, {words.option, words.name, row->modules[0]});
     words.preset = row->preset ? row->preset : "";
+    if (row->standard && hasStandards(words.modules.front()))
+        words.settings.insert(words.settings.begin(), {"standard", row->standard});
 }
 
 }  // namespace

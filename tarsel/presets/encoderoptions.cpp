@@ -68,6 +68,9 @@ void setBitrate(QvEncoder& encoder, int type, const std::string& text, const std
     setChecked(encoder, "bitrate", Any(rate), option);
 }
 
+// What its format decides of the rates of sound comes later, see setSoundRate.
+bool isSoundRate(const std::string& key) { return key == "bitrate" || key == "aBitrate"; }
+
 void setTwoPass(QvEncoder& encoder) {
     if (!ask(encoder, "twoPassPossible").isTrue()) throw failure(Msg::encoderNoTwoPass, {encoder.name()});
     setChecked(encoder, "twoPass", 1, "--two-pass");
@@ -123,10 +126,27 @@ void setEncoder(QvEncoder& encoder, int type, const EncoderOptions& options, con
     const bool video = type == qvVideoStream;
     if (isRawEncoder(encoder) && first != (video ? "--vcodec" : "--acodec"))
         throw failure(Msg::encoderRaw, {first, output});
+    // It decides what the others may be.
+    for (const auto& [key, value] : options.video)
+        if (video && key == "standard")
+            setGuessed(encoder, key, value, std::string("--vcodec ") + encoder.name());
     if (video && !options.crf.empty()) setGuessed(encoder, "crf", options.crf, "--crf");
-    const std::string& rate = video ? options.bitrate : options.audioBitrate;
-    if (!rate.empty()) setBitrate(encoder, type, rate, video ? "--bitrate" : "--audio-bitrate");
+    if (video && !options.bitrate.empty()) setBitrate(encoder, type, options.bitrate, "--bitrate");
     for (const auto& [key, value] : video ? options.video : options.audio)
-        setGuessed(encoder, key, value, std::string(video ? "--vcodec " : "--acodec ") + encoder.name());
+        if (video || !isSoundRate(key))
+            setGuessed(encoder, key, value, std::string(video ? "--vcodec " : "--acodec ") + encoder.name());
     if (video && options.twoPass) setTwoPass(encoder);
+}
+
+void setSoundRate(QvEncoder& encoder, const EncoderOptions& options) {
+    if (!options.audioBitrate.empty())
+        setBitrate(encoder, qvAudioStream, options.audioBitrate, "--audio-bitrate");
+    for (const auto& [key, value] : options.audio)
+        if (isSoundRate(key)) setGuessed(encoder, key, value, std::string("--acodec ") + encoder.name());
+}
+
+void checkQuality(const QvEncoder& encoder) {
+    const Any quality = ask(encoder, "crf"), rate = ask(encoder, "vBitrate");
+    if (quality.isFloat() && quality.toDouble() < 0 && rate.isFloat() && rate.toDouble() <= 0)
+        throw failure(Msg::encoderNoQuality, {encoder.name()});
 }

@@ -30,5 +30,9 @@ struct EncoderOptions {
 int parseBitrate(const std::string& text, const std::string& option);
 
 // Sets an encoder of a type. `output`: for messages. Throws Failure for what it does not have, or does not
-// take.
+// take. Bit rates of sound are left to setSoundRate.
 void setEncoder(QvEncoder& encoder, int type, const EncoderOptions& options, const std::string& output);
+// Which bit rates of sound there are depends on its format, which the encoder has by now. Throws Failure.
+void setSoundRate(QvEncoder& encoder, const EncoderOptions& options);
+// Throws Failure for an encoder of the picture that is left with neither a quality nor a bit rate.
+void checkQuality(const QvEncoder& encoder);

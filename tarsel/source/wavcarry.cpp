@@ -4,6 +4,7 @@
 #include <vector>
 
 #include "tarsel/source/source.h"
+#include "tarsel/source/wavwords.h"
 
 namespace {
 
@@ -38,15 +39,19 @@ std::string carryWavChunks(const Source& source, int stream, const WavPart& part
     std::vector<std::string> lost;
     const Any chunks = askedOf(decoder, "chunks"), others = askedOf(decoder, "otherChunks");
     const int fromRate = decoder.getStreamParam(kAudio, stream, "samplerate").toInt32();
-    if (chunks.isVector() && !chunks.asVector().empty() && output)
-        output->setParam("chunks", QvWavChunks::ofPart(chunks.asVector(), {.first = part.first,
-                                                                           .samples = part.samples,
-                                                                           .fromRate = fromRate,
-                                                                           .toRate = part.samplerate,
-                                                                           .bits = part.bits,
-                                                                           .changed = part.changed}));
-    if (chunks.isVector() && !output)
-        for (const Any& chunk : chunks.asVector()) add(lost, idOf(chunk.asDict().getString("id", "")));
+    AnyVector kept = chunks.isVector() ? chunks.asVector() : AnyVector();
+    if (!kept.empty() && output)
+        kept = QvWavChunks::ofPart(kept, {.first = part.first,
+                                          .samples = part.samples,
+                                          .fromRate = fromRate,
+                                          .toRate = part.samplerate,
+                                          .bits = part.bits,
+                                          .changed = part.changed});
+    if (output && part.words) kept = withWavWords(kept, *part.words);
+    if (output && !kept.empty()) output->setParam("chunks", kept);
+    if (!output)
+        for (const Any& chunk : kept)
+            if (!part.isFilm || !isOfWavWords(chunk)) add(lost, idOf(chunk.asDict().getString("id", "")));
     if (others.isVector())
         for (const Any& id : others.asVector()) add(lost, idOf(id.asString("")));
 

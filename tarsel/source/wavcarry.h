@@ -12,8 +12,10 @@ struct WavPart {
     long long first = 0;     // sample of the source; below 0: that many of silence come before it
     long long samples = -1;  // of the source; negative: all of them
     int samplerate = 0, channels = 0, bits = 0;
-    bool changed = false;  // by filters or other channels
-    bool isRf64 = false;   // the file is so large that its header has no room for a channel mask
+    bool changed = false;            // by filters or other channels
+    bool isRf64 = false;             // the file is so large that its header has no room for a channel mask
+    bool isFilm = false;             // the output has the texts of "LIST" as its own
+    const AnyDict* words = nullptr;  // that the output gets in the place of these; null: it keeps them
 };
 
 // Gives words and marks of the source to the stream that writes the WAV; null for an output that has no room

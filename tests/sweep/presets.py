@@ -15,7 +15,7 @@ CARD = "testgen:size=720x576,rate=25,duration="
 EXTENSIONS = {"mp4mux": "mp4", "movmux": "mov", "mkvmux": "mkv", "webmmux": "webm", "mxfmux": "mxf", "mptsmux": "ts",
               "mpegpsmux": "mpg", "dvmux": "dv", "dvavimux": "avi", "flacmux": "flac", "oggmux": "ogg",
               "y4mmux": "y4m", "rawavimux": "avi"}
-CODECS = {"h264venc": "h264", "h265venc": "hevc", "av1venc": "av1", "mpegvenc": "mpeg[12]video", "mpeg4venc": "mpeg4",
+CODECS = {"h264venc": "h264", "h265venc": "hevc", "av1venc": "av1", "mpegvenc": "mpeg[12]video", "mpeg4venc": "mpeg4|h263",
           "vc3venc": "dnxhd", "dvvenc": "dvvideo", "dv100venc": "dvvideo", "mj2kvenc": "jpeg2000",
           "proresvenc": "prores", "ffv1venc": "ffv1", "rawvenc": "rawvideo", "aacaenc": "aac", "mpegaenc": "mp2",
           "mp3aenc": "mp3", "ddaenc": "ac3", "ddproaenc": "ac3", "ddplusproaenc": "eac3", "flacaenc": "flac",

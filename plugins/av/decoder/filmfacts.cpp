@@ -17,6 +17,9 @@ constexpr const char* texts[] = {"title",         "artist",     "album",        
                                  "season_number", "episode_id", "episode_sort", "network",      "description",
                                  "synopsis",      "comment",    "copyright",    "publisher",    "performer",
                                  "creation_time", "location",   "make",         "model"};
+// What MXF calls them.
+constexpr const char* others[][2] = {{"title", "material_package_name"},
+                                     {"creation_time", "modification_date"}};
 constexpr std::size_t longest = 4000;  // bytes of a text
 constexpr unsigned mostChapters = 10000;
 
@@ -78,6 +81,9 @@ AnyDict filmFacts(const AVFormatContext& container, const FilmZero& zero) {
     AnyDict facts;
     for (const char* name : texts)
         if (const std::string found = text(container.metadata, name); !found.empty())
+            facts.set(name, Any(found.c_str()));
+    for (const auto& [name, other] : others)
+        if (const std::string found = text(container.metadata, other); !found.empty() && !facts.isSet(name))
             facts.set(name, Any(found.c_str()));
     if (const std::string timecode = timecodeOf(container); !timecode.empty()) {
         facts.set("timecode", Any(timecode.c_str()));

@@ -17,6 +17,7 @@ extern "C" QV_API QvPlugin* plugin_init() {
         av::addDecoders(plugin, library);
         av::addMultiplexers(plugin, library);
         av::addEncoders(plugin, library);
+        av::addMissing(plugin);
     }
     plugin.setAttr("version", "1.0");
     plugin.setAttr("versionDate", "2026-11-22");

@@ -19,5 +19,6 @@ QvModule* newModule(const std::shared_ptr<CodecLibrary>& library, int type, cons
 void addDecoders(QvPlugin& plugin, const std::shared_ptr<CodecLibrary>& library);
 void addMultiplexers(QvPlugin& plugin, const std::shared_ptr<CodecLibrary>& library);
 void addEncoders(QvPlugin& plugin, const std::shared_ptr<CodecLibrary>& library);  // and the presets
+void addMissing(QvPlugin& plugin);
 
 }  // namespace av

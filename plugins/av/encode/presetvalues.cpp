@@ -15,6 +15,8 @@ constexpr const char* h264 = "h264venc";
 constexpr const char* mpeg = "mpegvenc";
 constexpr const char* mpeg1 = "MPEG-1";
 constexpr const char* mpeg2 = "MPEG-2";
+constexpr const char* mpeg4 = "MPEG-4";
+constexpr const char* h263 = "H.263";
 constexpr double tv = 4.0 / 3, wide = 16.0 / 9;
 // Fields are coded as such, and quantisers rise as fast as broadcasting wants.
 constexpr const char* imx50 =
@@ -81,13 +83,13 @@ constexpr PresetVideo rows[] = {
     {"XDCAM_HD_420_540_12_5", mpeg, mpeg2, 1440, 540, false, 0, 25, 0, wide,   12.5e6, 0,     12, 3, I420, "main",     0,  xdcam},
     {"XDCAM_HD_420_540_8_75", mpeg, mpeg2, 1440, 540, false, 0, 25, 0, wide,   7.5e6, 8.75e6, 12, 3, I420, "main",     0,  xdcam},
     {"XDCAM_HD_420_540_17_5", mpeg, mpeg2, 1440, 540, false, 0, 25, 0, wide,   15e6, 17.5e6,  12, 3, I420, "main",     0,  xdcam},
-    {"3GP_MPEG4", "mpeg4venc", "",      176, 144,   false, 0,   15, 0, tv,     96e3, 128e3,   0, 1, I420, "",         0,  ""},
-    {"3GP_H263",  "mpeg4venc", "",      176, 144,   false, 0,   15, 0, tv,     96e3, 128e3,   0, 1, I420, "",         0,  ""},
-    {"MPEG4_SD",     "mpeg4venc", "",   0, 0,       false, 0,   0,  0, 0,      2e6, 4e6,       0, 2, I420, "",         0,  ""},
-    {"MPEG4_HD",     "mpeg4venc", "",   0, 0,       false, 0,   0,  0, 0,      6e6, 10e6,      0, 2, I420, "",         0,  ""},
-    {"PSP_MPEG4_320x240", "mpeg4venc", "", 320, 240, false, 0, 29.97, 0, 0,    512e3, 768e3,   0, 1, I420, "",         0,  ""},
-    {"IPOD_MPEG4_640x480", "mpeg4venc", "", 640, 480, false, 0, 29.97, 0, 0,   1.5e6, 2.5e6,   0, 1, I420, "",         0,  ""},
-    {"IPOD_MPEG4_320x240", "mpeg4venc", "", 320, 240, false, 0, 29.97, 0, 0,   512e3, 768e3,   0, 1, I420, "",         0,  ""},
+    {"3GP_MPEG4", "mpeg4venc", mpeg4,      176, 144,   false, 0,   15, 0, tv,     96e3, 128e3,   0, 1, I420, "",         0,  ""},
+    {"3GP_H263",  "mpeg4venc", h263,    176, 144,   false, 0,   15, 0, tv,     96e3, 128e3,   0, 1, I420, "",         0,  ""},
+    {"MPEG4_SD",     "mpeg4venc", mpeg4,   0, 0,       false, 0,   0,  0, 0,      2e6, 4e6,       0, 2, I420, "",         0,  ""},
+    {"MPEG4_HD",     "mpeg4venc", mpeg4,   0, 0,       false, 0,   0,  0, 0,      6e6, 10e6,      0, 2, I420, "",         0,  ""},
+    {"PSP_MPEG4_320x240", "mpeg4venc", mpeg4, 320, 240, false, 0, 29.97, 0, 0,    512e3, 768e3,   0, 1, I420, "",         0,  ""},
+    {"IPOD_MPEG4_640x480", "mpeg4venc", mpeg4, 640, 480, false, 0, 29.97, 0, 0,   1.5e6, 2.5e6,   0, 1, I420, "",         0,  ""},
+    {"IPOD_MPEG4_320x240", "mpeg4venc", mpeg4, 320, 240, false, 0, 29.97, 0, 0,   512e3, 768e3,   0, 1, I420, "",         0,  ""},
     {"DV",            "dvvenc", "",     720, 576,   true, 480,  25, 2, tv,     0, 0,           0, 0, YUYV, "25",       0,  ""},
     {"DVCAM",         "dvvenc", "",     720, 576,   true, 480,  25, 2, tv,     0, 0,           0, 0, YUYV, "25",       0,  ""},
     {"DVAVI_DV",      "dvvenc", "",     720, 576,   true, 480,  25, 2, tv,     0, 0,           0, 0, YUYV, "25",       0,  ""},

@@ -2,10 +2,12 @@
 
 #include <algorithm>
 #include <array>
+#include <climits>
 #include <cstdlib>
 #include <cstring>
 #include <string_view>
 
+#include "core/engine/log/qvlog.h"
 #include "core/engine/qvutil.h"
 #include "core/media/qvpcm.h"
 #include "core/preset/qvprofile.h"
@@ -69,12 +71,18 @@ bool holds(std::span<const int> values, int value) {
 bool is(C s, const char* module) { return std::strcmp(s.codec->module, module) == 0; }
 
 constexpr int leastFastRate = 32000;  // of MPEG-1
+constexpr int aacMost = 6;            // bits a sample and channel, 6144 a frame
 
 // Those that fit the rate and the channels.
 std::span<const int> kilobitsOf(C s) {
     const auto all = s.codec->kilobits;
     if (s.samplerate < leastFastRate && !s.codec->lowKilobits.empty()) return s.codec->lowKilobits;
-    if (is(s, "opusaenc") && s.channels == 1) return all.first(10);                      // 256 a channel
+    if (is(s, "opusaenc") && s.channels == 1) return all.first(10);  // 256 a channel
+    if (is(s, "aacaenc")) {
+        const auto most =
+            std::upper_bound(all.begin(), all.end(), aacMost * s.samplerate * s.channels / 1000);
+        return all.first(static_cast<std::size_t>(most - all.begin()));
+    }
     if (s.codec->kilobits.data() == dolbyBits && s.channels > 2) return all.subspan(1);  // 32 are too few
     return all;
 }
@@ -367,6 +375,7 @@ bool SoundEnc::sendHead(bool last) {
     head.profile = -1;
     if (context_) {
         const AVCodecContext& c = *context_;
+        if (c.bit_rate > 0 && c.bit_rate <= INT_MAX) head.bitrate = static_cast<int>(c.bit_rate);
         if (c.ch_layout.order == AV_CHANNEL_ORDER_NATIVE) head.mask = c.ch_layout.u.mask;
         head.frameSize = c.frame_size;
         head.initialPadding = c.initial_padding;
@@ -391,6 +400,10 @@ int SoundEnc::open() {
         release();
         return setError(QvStatus::failed, "%s", why.empty() ? output_.problem().c_str() : why.c_str());
     }
+    if (settings_.stated() && bitsPerSecond(settings_) != 1000.0 * settings_.kilobits)
+        qv_log()->warning("%s: %d kbit/s are used, as %d kbit/s are none of those for %d Hz and %d channels",
+                          name(), static_cast<int>(bitsPerSecond(settings_) / 1000), settings_.kilobits,
+                          settings_.samplerate, settings_.channels);
     setState(qvStateOpen);
     return QvStatus::ok;
 }

@@ -38,6 +38,8 @@ struct SoundSettings {
     int kilobits;  // that are wanted; the nearest of those that the rate has is used
     std::string options;
 
+    // The bit rate was asked for, as far as can be known.
+    bool stated() const { return !codec->kilobits.empty() && kilobits != codec->usualKilobits; }
     static std::span<const QvParamRow<SoundSettings>> rows();
 };
 

@@ -145,6 +145,9 @@ std::string VideoEnc::prepare() {
         return "Sides of pictures are " + std::to_string(least) + " to " + std::to_string(codec.most) +
                " pixels" + (codec.step > 1 ? ", multiples of " + std::to_string(codec.step) : "") + ", not " +
                std::to_string(s.width) + "x" + std::to_string(s.height);
+    if (!s.takesSize())
+        return "H.263 has pictures of 128x96, 176x144, 352x288, 704x576 and 1408x1152, not of " +
+               std::to_string(s.width) + "x" + std::to_string(s.height);
     if (s.codesFields() && !s.takesFields())
         return "The codec takes two fields a picture in 4:2:2 of 1920x1080 only";
     if (s.twoPass && !s.passes) return "There are no statistics of a first pass";
@@ -231,9 +234,20 @@ std::string VideoEnc::describeCodec() {
     if (!set(s.codec->tune, s.tune)) return "There is no tune '" + s.tune + "'";
     if (is(*s.codec, "dvvenc") || is(*s.codec, "dv100venc")) return "";
     const VideoForm& form = *s.codec->form(s.type);
-    const std::string profile = s.codesFields() && is(*s.codec, "vc3venc") ? "dnxhd"
-                                : form.profile                             ? form.profile
-                                                                           : s.codecProfile;
+    std::string profile = s.codesFields() && is(*s.codec, "vc3venc") ? "dnxhd"
+                          : form.profile                             ? form.profile
+                                                                     : s.codecProfile;
+    // The library writes to the standard error about profiles that do not go with the rest.
+    if (is(*s.codec, "h264venc")) {
+        const bool lossless =
+            s.byQuality() && s.quality < 1 && s.type != QvFourcc::W016 && s.type != QvFourcc::Y216;
+        if (lossless && form.profile) profile = "high444";
+        if (lossless && !profile.empty() && profile != "high444")
+            return "The profile '" + profile + "' has no lossless pictures, which crf " +
+                   std::to_string(s.quality) + " asks for";
+        if (profile == "baseline" && s.codesFields())
+            return "The profile 'baseline' has no interlaced pictures";
+    }
     if (!set("profile", profile)) return "There is no profile '" + profile + "'";
     return "";
 }
@@ -249,6 +263,12 @@ std::string VideoEnc::configureRate() {
         if (s.n > 1 && s.codec->has(VideoTrait::statsText)) c.flags |= AV_CODEC_FLAG_CLOSED_GOP;
         if (s.m > 1 && is(*s.codec, "h264venc")) av_opt_set(&c, "forced-idr", "1", AV_OPT_SEARCH_CHILDREN);
     }
+    if (!s.timecode.empty() && is(*s.codec, "mpegvenc")) {
+        std::string timecode = s.timecode;
+        // The library drops numbers at this rate only.
+        if (c.framerate.num != 30000) std::replace(timecode.begin(), timecode.end(), ';', ':');
+        av_opt_set(&c, "gop_timecode", timecode.c_str(), AV_OPT_SEARCH_CHILDREN);
+    }
     // Which of the tables of DNxHD it is: that of its highest quality.
     if (s.codesFields() && is(*s.codec, "vc3venc")) c.bit_rate = s.rate.rate().ratio() > 26 ? 220e6 : 185e6;
     if (!s.codec->has(VideoTrait::rated)) return "";
@@ -261,14 +281,18 @@ std::string VideoEnc::configureRate() {
     c.bit_rate = static_cast<std::int64_t>(target);
     const bool constant = s.vbr == QvBitrate::cbr;
     const double most = constant ? target : s.most > target ? s.most : 0;
-    if (most > 0 && !is(*s.codec, "av1venc")) {
+    const bool av1 = is(*s.codec, "av1venc");
+    if (av1 && !constant && most > 0)
+        qv_log()->warning("%s has no highest bit rate; only the average of %lld kbit/s is kept", name(),
+                          static_cast<long long>(c.bit_rate / 1000));
+    if (most > 0 && (constant || !av1)) {
         c.rc_max_rate = static_cast<std::int64_t>(most);
         // The models of MPEG-2 at main and high level; the others get a second.
         const bool mpeg = is(*s.codec, "mpegvenc");
         const double buffer = !mpeg ? most : most <= 15e6 ? 1835008 : 9781248;
         c.rc_buffer_size = static_cast<int>(std::min(buffer, 2e9));
     }
-    if (constant && is(*s.codec, "mpegvenc")) c.rc_min_rate = c.rc_max_rate;
+    if (constant && (av1 || is(*s.codec, "mpegvenc"))) c.rc_min_rate = c.rc_max_rate;
     // The others fill no stream up.
     const bool fills = is(*s.codec, "mpegvenc") || is(*s.codec, "mpeg4venc");
     if (!constant && fills && most > 0) c.rc_min_rate = static_cast<std::int64_t>(std::min(s.least, target));
@@ -280,8 +304,11 @@ std::string VideoEnc::configurePass() {
     AVCodecContext& c = *context_;
     const bool x265 = is(*s.codec, "h265venc");
     std::string own = x265 ? "log-level=none:open-gop=0" : "";
-    // Its own pool has a thread a core otherwise.
-    if (x265 && s.threads > 0) own += ":pools=" + std::to_string(s.threads);
+    // Its own pool has a thread a core otherwise, and more pictures at a time where there are more cores.
+    if (x265 && s.threads > 0) {
+        const int pictures = s.threads >= 16 ? 4 : s.threads >= 8 ? 3 : s.threads >= 4 ? 2 : 1;
+        own += ":pools=" + std::to_string(s.threads) + ":frame-threads=" + std::to_string(pictures);
+    }
     if (s.passes && s.codec->has(VideoTrait::statsText | VideoTrait::statsFile)) {
         c.flags |= s.firstPass ? AV_CODEC_FLAG_PASS1 : AV_CODEC_FLAG_PASS2;
         if (s.codec->has(VideoTrait::statsFile)) {
@@ -357,6 +384,11 @@ int VideoEnc::writeFrame(QvFrame* frame) {
     picture->interlaced_frame = settings_.rate.interlaced() != 0;
     picture->top_field_first = settings_.rate.isTopFirst();
     const int sent = avcodec_send_frame(context_.get(), picture);
+    // The library gives no code where what fills a constant rate up is larger than the buffer for a picture.
+    if (sent == AVERROR(EPERM) && context_->rc_min_rate > 0)
+        return setError(
+            QvStatus::failed, "Pictures of %dx%d can't be filled up to %lld kbit/s; set a lower bit rate",
+            settings_.width, settings_.height, static_cast<long long>(context_->rc_min_rate / 1000));
     if (sent < 0)
         return setError(QvStatus::failed, "The encoder refused a picture (%s)", errorText(sent).c_str());
     ++frames_;

@@ -2,8 +2,10 @@
 
 #include <algorithm>
 #include <cmath>
+#include <cstdio>
 #include <cstring>
 #include <string_view>
+#include <utility>
 #include <vector>
 
 #include "core/measure/fourcc.h"
@@ -29,6 +31,8 @@ constexpr Rate rates[] = {{5, 0},      {6, 0},     {7.5, 0}, {8, 0},      {9, 0}
                           {59.94, 0},  {60, 0},    {100, 0}, {119.88, 0}, {120, 0}};
 constexpr Rate mpegRates[] = {{23.976, 0}, {24, 0}, {25, 0}, {25, 1}, {25, 2},    {29.97, 0}, {29.97, 1},
                               {29.97, 2},  {30, 0}, {30, 1}, {50, 0}, {59.94, 0}, {60, 0}};
+constexpr Rate phoneRates[] = {{5, 0},  {6, 0},  {7.5, 0},    {8, 0},  {10, 0}, {12, 0},   {12.5, 0},
+                               {15, 0}, {20, 0}, {23.976, 0}, {24, 0}, {25, 0}, {29.97, 0}};
 constexpr Rate tvRates[] = {{25, 2}, {25, 0}, {29.97, 2}, {29.97, 0}};
 constexpr Rate hdTapeRates[] = {{25, 1}, {25, 0}, {29.97, 1}, {29.97, 0}, {50, 0}, {59.94, 0}};
 
@@ -42,6 +46,7 @@ std::span<const Rate> ratesOf(const S& s) {
     if (isHdTape(s)) return hdTapeRates;
     if (std::strcmp(s.codec->module, "mpegvenc") == 0) return mpegRates;
     if (std::strcmp(s.codec->module, "dvvenc") == 0) return tvRates;
+    if (std::strcmp(s.codec->encoder, "h263") == 0) return phoneRates;
     return rates;
 }
 
@@ -51,6 +56,8 @@ void framerateRange(const S& s, Any& value) {
         if (row.interlaced == 0 || s.takesFields()) all.append(QvFramerate(row.rate, row.interlaced));
     value = all;
 }
+
+constexpr std::pair<int, int> h263Sizes[] = {{128, 96}, {176, 144}, {352, 288}, {704, 576}, {1408, 1152}};
 
 AnyDict sizePair(int w, int h) { return AnyDict("w", w, "h", h); }
 
@@ -63,6 +70,8 @@ void sizeRange(const S& s, Any& value) {
         sizes.append(sizePair(1280, 1080));
         sizes.append(sizePair(960, 720));
     }
+    if (std::strcmp(s.codec->encoder, "h263") == 0)
+        for (const auto& [w, h] : h263Sizes) sizes.append(sizePair(w, h));
     if (!sizes.empty())
         value = sizes;
     else
@@ -142,9 +151,17 @@ int setPal(S& s, const Any& value) {
 int setStandard(S& s, const Any& value) {
     std::string wanted;
     if (!qvparam::convert(value, wanted)) return QvStatus::invalidParam;
-    const VideoCodec* const row = videoCodec(s.codec->module, wanted.c_str());
+    const VideoCodec* const row =
+        wanted.empty() ? videoCodec(s.codec->module) : videoCodec(s.codec->module, wanted.c_str());
     if (!row) return QvStatus::invalidParam;
+    if (row == s.codec) return QvStatus::ok;
     s.codec = row;
+    // Those of the other one mean nothing here.
+    s.codecProfile = row->profile;
+    s.profileOptions.clear();
+    s.m = std::min(s.m, row->mostM);
+    if (!row->has(VideoTrait::interlaced)) s.rate.setInterlaced(0);
+    if (s.target > 0) s.target = std::clamp(s.target, row->lowBits, row->highBits);
     if (!row->form(s.type)) s.type = row->forms.front().fourcc;
     return QvStatus::ok;
 }
@@ -178,6 +195,20 @@ int setCodecProfile(S& s, const Any& value) {
     return setNamed(s, "profile", profilesOf(*s.codec), value, s.codecProfile);
 }
 
+int setTimecode(S& s, const Any& value) {
+    std::string wanted;
+    int part[4] = {};
+    char last = 0, drops = 0;
+    if (!qvparam::convert(value, wanted)) return QvStatus::invalidParam;
+    if (!wanted.empty() && (std::sscanf(wanted.c_str(), "%2d:%2d:%2d%c%2d%c", &part[0], &part[1], &part[2],
+                                        &drops, &part[3], &last) != 5 ||
+                            (drops != ':' && drops != ';') || part[0] > 23 || part[1] > 59 || part[2] > 59 ||
+                            *std::min_element(part, part + 4) < 0))
+        return QvStatus::invalidParam;
+    s.timecode = wanted;
+    return QvStatus::ok;
+}
+
 int setPasses(S& s, const Any& value) {
     if (value.isValid() && !value.isGeneric()) return QvStatus::invalidParam;
     s.passes = value.isValid() ? static_cast<bufstream*>(const_cast<void*>(value.asGeneric())) : nullptr;
@@ -207,11 +238,6 @@ void fixed(const S&, Any& value) {
 
 using C = const S&;
 const Row commonRows[] = {
-    {.name = "standard",
-     .member = Access{setStandard, [](C s, Any& v) { v = s.codec->standard; }},
-     .flags = qvParamStored,
-     .help = "MPEG-2 or MPEG-1, of an encoder of both",
-     .type = Any::String},
     {.name = "profile",
      .member = Access{setProfile, [](C s, Any& v) { v = s.profile; }},
      .flags = qvParamStored,
@@ -222,6 +248,12 @@ const Row commonRows[] = {
      .flags = qvParamStored,
      .help = "1: size and rate of a preset for television are those of 50 Hz",
      .type = Any::Int32},
+    // After the rows of presets, which have one of their own.
+    {.name = "standard",
+     .member = Access{setStandard, [](C s, Any& v) { v = s.codec->standard; }},
+     .flags = qvParamStored,
+     .help = "MPEG-2 or MPEG-1, MPEG-4 or H.263, of an encoder of both",
+     .type = Any::String},
     {"width", &S::width, qvParamStored, 0, 16384, "", "pixels", "0: not set"},
     {"height", &S::height, qvParamStored, 0, 16384, "", "pixels", "0: not set"},
     {.name = "framerate",
@@ -331,6 +363,7 @@ const Row rateRows[] = {
      .member = Access{[](S& s, const Any& value) { return setBits(s, value, &S::most); },
                       [](C s, Any& v) { v = s.most > 0 ? s.most : nominalBits(s); }},
      .unit = "bit/s",
+     .help = "AV1 has none",
      .type = Any::Float},
     {"minVBitrate", &S::least, qvParamStored, 0, 4e9, "", "bit/s",
      "MPEG-1, 2 and 4 with a maximum; the others do not fill up"},
@@ -339,6 +372,11 @@ const Row rateRows[] = {
      Access{nullptr, [](C s, Any& v) { v = AnyVector(bits(s.codec->lowBits), bits(s.codec->highBits)); }}},
     {"estimateSecKb",
      Access{nullptr, [](C s, Any& v) { v = Any(static_cast<float>(nominalBits(s) / 8000)); }}},
+    {.name = "timecode",
+     .member = Access{setTimecode, [](C s, Any& v) { v = textOf(s.timecode); }},
+     .flags = qvParamStored,
+     .help = "of the first picture, HH:MM:SS:FF; MPEG-1 and -2 have it in each group",
+     .type = Any::String},
     {"twoPass", &S::twoPass, qvParamPlain},
     {.name = "firstPass",
      .member = &S::firstPass,
@@ -401,6 +439,12 @@ std::span<const QvParamRow<VideoSettings>> VideoSettings::rows(const VideoCodec&
 bool VideoSettings::takesFields() const {
     if (std::strcmp(codec->module, "vc3venc") != 0) return codec->has(VideoTrait::interlaced);
     return (width == 0 || (width == 1920 && height == 1080)) && type != QvFourcc::b64a;
+}
+
+bool VideoSettings::takesSize() const {
+    return std::strcmp(codec->encoder, "h263") != 0 ||
+           std::find(std::begin(h263Sizes), std::end(h263Sizes), std::pair(width, height)) !=
+               std::end(h263Sizes);
 }
 
 void VideoSettings::applyProfile() {

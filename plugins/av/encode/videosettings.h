@@ -30,9 +30,10 @@ struct VideoSettings {
     int n = 1, m = 1;                        // pictures of a group, and from one anchor to the next
     int threads = 0, profile = -1, matrix = 0;
     int primaries = 0, transfer = 0, space = 0;  // code points of ITU-T H.273; 0: by the matrix
-    bool pal = true, twoPass = false, firstPass = false, lowDelay = false;
+    bool pal = true, twoPass = false, firstPass = false;
     int topLines = 0;  // that the picture has above the shown ones
     std::string preset, tune, codecProfile, options;
+    std::string timecode;         // of the first picture, "HH:MM:SS:FF"
     std::string profileOptions;   // of the preset
     bufstream* passes = nullptr;  // borrowed
 
@@ -40,6 +41,8 @@ struct VideoSettings {
     bool codesFields() const { return rate.interlaced() != 0; }
     // The codec has such pictures of two fields; of a size that is not set yet, it may.
     bool takesFields() const;
+    // Of H.263 there are five; of the others only the limits of VideoCodec count.
+    bool takesSize() const;
     // The tables that the codec has, in the order in which they are stored and restored.
     static std::span<const QvParamRow<VideoSettings>> rows(const VideoCodec& codec);
     // What a preset stands for; what it leaves open stays.

@@ -22,6 +22,7 @@ constexpr auto codecRows = std::to_array<MuxCodecRow>({
     {mpeg1,    AV_CODEC_ID_MPEG1VIDEO, "MPEG-1",    "MPG1,MP1V,MPEG",           true},
     {mpeg2,    AV_CODEC_ID_MPEG2VIDEO, "MPEG-2",    "MPG2,MP2V,M2V ",           true},
     {mpeg4,    AV_CODEC_ID_MPEG4,      "MPEG-4",    "MP4V,FMP4,MPG4",           true},
+    {h263,     AV_CODEC_ID_H263,       "H.263",     "H263,S263",                false},
     {dnxhd,    AV_CODEC_ID_DNXHD,      "DNxHD",     "AVDN,VC3 ,VC-3,DNXH,AVDH", false},
     {dv,       AV_CODEC_ID_DVVIDEO,    "DV",        "DV  ,DVSD,DV25,DV50,DVH1,DV1H,DVCP", false},
     {jpeg2000, AV_CODEC_ID_JPEG2000,   "JPEG 2000", "MJ2K,MJP2,JP2K,J2K ,MJ2 ", false},
@@ -43,8 +44,8 @@ static_assert(codecRows.size() == static_cast<std::size_t>(MuxCodec::count));
 
 constexpr std::uint32_t everySound = codecBits(aac, mp2, mp3, ac3, eac3, flac, opus, vorbis, pcm);
 constexpr std::uint32_t everything = (1u << static_cast<int>(MuxCodec::count)) - 1;
-constexpr std::uint32_t mp4Codecs = codecBits(h264, hevc, av1, vp9, mpeg1, mpeg2, mpeg4, mjpeg, jpeg2000, aac, mp3, ac3, eac3, flac, opus, vorbis, pcm);
-constexpr std::uint32_t movCodecs = codecBits(h264, hevc, mpeg2, mpeg4, dnxhd, dv, jpeg2000, prores, mjpeg, raw, aac, mp3, ac3, eac3, pcm);
+constexpr std::uint32_t mp4Codecs = codecBits(h264, hevc, av1, vp9, mpeg1, mpeg2, mpeg4, h263, mjpeg, jpeg2000, aac, mp3, ac3, eac3, flac, opus, vorbis, pcm);
+constexpr std::uint32_t movCodecs = codecBits(h264, hevc, mpeg2, mpeg4, h263, dnxhd, dv, jpeg2000, prores, mjpeg, raw, aac, mp3, ac3, eac3, pcm);
 
 // In the order of muxerModules.
 constexpr auto containers = std::to_array<Container>({
@@ -52,10 +53,10 @@ constexpr auto containers = std::to_array<Container>({
     //   words
     //   traits
     {"mp4",          mp4Codecs,                                                    16, 32, PipeForm::fragments,
-         title | commonTags | chapters | timecode | language,
+         title | commonTags | chapters | timecode | language | creationTime | location,
          lengths | indexInFront | pixels},
     {"mov",          movCodecs,                                                    16, 32, PipeForm::fragments,
-         title | commonTags | chapters | timecode | language,
+         title | commonTags | chapters | timecode | language | creationTime | location,
          lengths | indexInFront | pixels},
     {"matroska",     everything,                                                   16, 64, PipeForm::live,
          title | commonTags | allTags | chapters | timecode | language,
@@ -64,7 +65,7 @@ constexpr auto containers = std::to_array<Container>({
          title | commonTags | allTags | chapters | language,
          lengths},
     {"mxf",          codecBits(mpeg2, h264, dnxhd, dv, jpeg2000, prores, pcm),      1, 16, PipeForm::none,
-         title | timecode,
+         title | timecode | creationTime,
          pixels | needsVideo | soundHeader, codecBit(h264)},
     {"mpegts",       codecBits(h264, hevc, mpeg1, mpeg2, mpeg4, aac, mp2, mp3, ac3, eac3, opus), 8, 32, PipeForm::same,
          title | language,
@@ -75,7 +76,7 @@ constexpr auto containers = std::to_array<Container>({
     {"dv",           codecBits(dv, pcm),                                            1, 4,  PipeForm::same,
          timecode,
          counted | needsVideo | pixels, 0, "rawvideo"},
-    {"avi",          codecBits(dv, mpeg4, mjpeg, ffv1, raw, mp2, mp3, ac3, pcm),    8, 32, PipeForm::none,
+    {"avi",          codecBits(dv, mpeg4, h263, mjpeg, ffv1, raw, mp2, mp3, ac3, pcm),    8, 32, PipeForm::none,
          title | commonTags | language,
          adts | counted, codecBit(mpeg4)},
     {"yuv4mpegpipe", codecBits(raw),                                                1, 0,  PipeForm::same,
@@ -127,6 +128,8 @@ std::uint32_t muxFourcc(AVCodecID id) {
 
 const MuxCodecRow& muxCodecRow(MuxCodec codec) { return codecRows[static_cast<std::size_t>(codec)]; }
 
+bool isSound(MuxCodec codec) { return (everySound & codecBit(codec)) != 0; }
+
 const MuxerModule& Container::module() const {
     return muxerModules[static_cast<std::size_t>(this - containers.data())];
 }
@@ -134,7 +137,7 @@ const MuxerModule& Container::module() const {
 std::string Container::takenNames(bool video) const {
     std::vector<std::string> names;
     for (const MuxCodecRow& row : codecRows)
-        if (takes(row.codec) && ((everySound & codecBit(row.codec)) == 0) == video) names.push_back(row.name);
+        if (takes(row.codec) && isSound(row.codec) != video) names.push_back(row.name);
     std::string all;
     for (std::size_t i = 0; i < names.size(); ++i)
         all += (i == 0 ? "" : i + 1 == names.size() ? " and " : ", ") + names[i];

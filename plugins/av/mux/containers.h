@@ -19,6 +19,7 @@ enum class MuxCodec {
     mpeg1,
     mpeg2,
     mpeg4,
+    h263,
     dnxhd,
     dv,
     jpeg2000,
@@ -49,6 +50,7 @@ struct MuxCodecRow {
 // Null for a FOURCC that no codec has.
 const MuxCodecRow* muxCodec(std::uint32_t fourcc);
 const MuxCodecRow& muxCodecRow(MuxCodec codec);
+bool isSound(MuxCodec codec);
 std::uint32_t muxFourcc(AVCodecID id);  // for a head; 0 for what no codec is
 
 constexpr std::uint32_t codecBit(MuxCodec codec) { return 1u << static_cast<int>(codec); }
@@ -68,7 +70,16 @@ enum class PipeForm {
 
 // What a container can say about the film.
 namespace FilmWord {
-enum : unsigned { title = 1, commonTags = 2, allTags = 4, chapters = 8, timecode = 16, language = 32 };
+enum : unsigned {
+    title = 1,
+    commonTags = 2,
+    allTags = 4,
+    chapters = 8,
+    timecode = 16,
+    language = 32,
+    creationTime = 64,
+    location = 128
+};
 }
 
 namespace MuxTrait {

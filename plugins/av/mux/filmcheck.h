@@ -10,11 +10,13 @@ namespace av {
 
 struct FilmExpectation {
     bool video;
-    long long units;  // written; -1: its index does not count them
+    long long units;  // written
 };
 
 // `format` is that of a Container. What is wrong with the file: it can't be opened, streams are missing, or
-// its index has other counts. "" if nothing is. Reads headers and indexes, not the units.
-std::string checkFilm(const Any& file, const char* format, const std::vector<FilmExpectation>& streams);
+// it has other counts of units. "" if nothing is. Reads headers and indexes, and of a film in `fragments`,
+// which has no index of all, every unit.
+std::string checkFilm(const Any& file, const char* format, const std::vector<FilmExpectation>& streams,
+                      bool fragments);
 
 }  // namespace av

@@ -2,10 +2,12 @@
 
 #include <algorithm>
 #include <cmath>
+#include <cstdlib>
 #include <cstring>
 #include <vector>
 
 #include "core/measure/mediatime.h"
+#include "plugins/av/source/avheaders.h"
 
 namespace av {
 
@@ -34,6 +36,20 @@ constexpr const char* ofSource[] = {"clipName", "userClipName", "startTimecode",
 std::string textOf(const Any& value) {
     const Any text = value.toString();
     return text.isString() ? text.asString() : "";
+}
+
+// As the libraries read it: "2020-01-02T03:04:05Z".
+bool isDate(const std::string& text) {
+    std::int64_t time = 0;
+    return av_parse_time(&time, text.c_str(), 0) >= 0;
+}
+
+// Of ISO 6709, "+59.3293+018.0686/", which some containers have as numbers.
+bool isPlace(const std::string& text) {
+    char* end = nullptr;
+    const double latitude = std::strtod(text.c_str(), &end);
+    const bool first = end != text.c_str() && (*end == '+' || *end == '-') && std::fabs(latitude) <= 90;
+    return first && std::fabs(std::strtod(end, nullptr)) <= 180;
 }
 
 double secondsOf(const Any& value) {
@@ -119,8 +135,11 @@ std::string setFilmWords(AVFormatContext& film, const Container& container, cons
         const auto row = std::find_if(std::begin(common), std::end(common),
                                       [&is](const auto& entry) { return is(entry.key); });
         const bool known = row != std::end(common);
-        const bool held = is("title") ? holds(FilmWord::title)
-                                      : holds(FilmWord::allTags) || (known && holds(FilmWord::commonTags));
+        const bool held =
+            is("title")           ? holds(FilmWord::title)
+            : is("creation_time") ? isDate(text) && holds(FilmWord::creationTime | FilmWord::allTags)
+            : is("location")      ? holds(FilmWord::allTags) || (holds(FilmWord::location) && isPlace(text))
+                                  : holds(FilmWord::allTags) || (known && holds(FilmWord::commonTags));
         if (held)
             setTag(film, container, known ? row->tag : key, text);
         else

@@ -16,6 +16,8 @@ namespace av {
 
 namespace {
 
+constexpr std::int64_t mostWaiting = std::int64_t{1} << 30;  // bytes of units before the header is written
+
 int openNothing(AVFormatContext*, AVIOContext**, const char*, int, AVDictionary**) { return AVERROR(EPERM); }
 
 // Two of the codes of ISO 639-2 stand for one language. QuickTime's list has the older ones.
@@ -69,10 +71,18 @@ bool FilmWriter::unit(std::size_t track, PacketPtr unit) {
 bool FilmWriter::putMade(std::size_t track) {
     bool ok = true;
     for (PacketPtr& unit : made_) {
-        if (!begun_)
-            waiting_.push_back({track, std::move(unit)});
-        else
+        if (begun_) {
             ok = ok && put(track, *unit);
+            continue;
+        }
+        waitingBytes_ += unit->size;
+        waiting_.push_back({track, std::move(unit)});
+    }
+    if (waitingBytes_ > mostWaiting) {
+        const auto late = std::find_if(tracks_.begin(), tracks_.end(),
+                                       [](const MuxTrack& other) { return !other.ready(); });
+        if (late != tracks_.end())
+            return fail(late->place() + ": nothing has come of it, and the others can't wait any longer");
     }
     made_.clear();
     return ok;
@@ -108,6 +118,12 @@ void FilmWriter::chooseFormat() {
                           job_.name.c_str());
         job_.format = "mov";
     }
+    // Its own box is that of 3GP, which is otherwise the same.
+    const auto isNoH263 = [](const MuxTrack& track) { return track.codec().codec != MuxCodec::h263; };
+    if (job_.format == std::string_view("mp4") && !all(isNoH263)) {
+        qv_log()->warning("'%s' has the form of 3GP, as MP4 has no word for H.263", job_.name.c_str());
+        job_.format = "3gp";
+    }
     if (job_.container->silent && all(std::mem_fn(&MuxTrack::video))) job_.format = job_.container->silent;
     if (job_.container->mpeg1 && all(old)) job_.format = job_.container->mpeg1;
 }
@@ -117,6 +133,15 @@ bool FilmWriter::canJoin() {
     if (job_.format != std::string_view("dv") || tracks_.front().parameters().height != 720) return true;
     return fail(std::string(job_.container->module().displayName) +
                 " does not hold DVCPRO HD of 720 lines with sound, but AVI and MXF do");
+}
+
+// The library writes every picture of JPEG 2000 as a whole one.
+bool FilmWriter::losesFields() const {
+    return job_.format == std::string_view("mxf") &&
+           std::any_of(tracks_.begin(), tracks_.end(), [](const MuxTrack& track) {
+               return track.codec().codec == MuxCodec::jpeg2000 &&
+                      track.parameters().field_order > AV_FIELD_PROGRESSIVE;
+           });
 }
 
 bool FilmWriter::begin() {
@@ -134,7 +159,8 @@ bool FilmWriter::begin() {
     made->strict_std_compliance = FF_COMPLIANCE_EXPERIMENTAL;
     for (MuxTrack& track : tracks_)
         if (!addStream(track)) return failWith("a stream could not be made", AVERROR(ENOMEM));
-    const std::string lost = setFilmWords(*made, *job_.container, job_.meta, seconds(), startTime());
+    std::string lost = setFilmWords(*made, *job_.container, job_.meta, seconds(), startTime());
+    if (losesFields()) lost += (lost.empty() ? "" : ", ") + std::string("the order of its fields");
     if (!lost.empty()) qv_log()->warning("'%s' does not hold: %s", job_.name.c_str(), lost.c_str());
     AVDictionary* options = nullptr;
     setOptions(&options);
@@ -146,6 +172,7 @@ bool FilmWriter::begin() {
     for (Waiting& first : waiting_) ok = ok && put(first.track, *first.unit);
     waiting_.clear();
     waiting_.shrink_to_fit();
+    waitingBytes_ = 0;
     return ok;
 }
 
@@ -210,8 +237,11 @@ void FilmWriter::setOptions(AVDictionary** options) {
     const Container& container = *job_.container;
     if (container.is(MuxTrait::indexInFront)) {
         const bool pipe = !job_.seekable;
-        av_dict_set(options, "movflags",
-                    pipe ? "+write_colr+frag_keyframe+delay_moov+default_base_moof" : "+write_colr", 0);
+        // Only a header that waits for the first units can say when the streams start.
+        const char* const flags = pipe ? "+write_colr+frag_keyframe+delay_moov+default_base_moof"
+                                  : makesFragments(job_.options) ? "+write_colr+delay_moov+default_base_moof"
+                                                                 : "+write_colr";
+        av_dict_set(options, "movflags", flags, 0);
         if (pipe) {
             av_dict_set(options, "min_frag_duration", "1000000", 0);
             av_dict_set(options, "frag_duration", "10000000", 0);
@@ -233,8 +263,13 @@ void FilmWriter::setOptions(AVDictionary** options) {
     AVDictionary* own = nullptr;
     parseMuxOptions(job_.options, job_.format, &own);
     const AVDictionaryEntry* entry = nullptr;
-    while ((entry = av_dict_get(own, "", entry, AV_DICT_IGNORE_SUFFIX)))
-        av_dict_set(options, entry->key, entry->value, *entry->value == '+' ? AV_DICT_APPEND : 0);
+    while ((entry = av_dict_get(own, "", entry, AV_DICT_IGNORE_SUFFIX))) {
+        // Flags come on top of those that the film needs.
+        const bool flags = std::strcmp(entry->key, "movflags") == 0;
+        const bool listed = *entry->value == '+' || *entry->value == '-';
+        const std::string value = (flags && !listed ? "+" : "") + std::string(entry->value);
+        av_dict_set(options, entry->key, value.c_str(), flags || *entry->value == '+' ? AV_DICT_APPEND : 0);
+    }
     av_dict_free(&own);
 }
 

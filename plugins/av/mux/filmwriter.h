@@ -71,6 +71,7 @@ class FilmWriter {
     std::vector<long long> written_;
     std::unique_ptr<AVFormatContext, Free> film_;
     std::vector<Waiting> waiting_;
+    std::int64_t waitingBytes_ = 0;
     std::vector<PacketPtr> made_;
     bool begun_ = false;
     bool spaceKept_ = false;
@@ -80,6 +81,7 @@ class FilmWriter {
     bool beginIfReady();
     void chooseFormat();
     bool canJoin();
+    bool losesFields() const;
     bool begin();
     bool addStream(MuxTrack& track);
     void setOptions(AVDictionary** options);

@@ -317,11 +317,11 @@ int Multiplexer::check() {
     if (outStream()->ioError() != 0)
         return setError(QvStatus::failed, "%s", outStream()->ioErrorText().c_str());
     std::vector<FilmExpectation> streams;
-    const bool fragments = makesFragments(settings_.avOptions);
     for (std::size_t i = 0; i < film_->tracks(); ++i)
-        streams.push_back({film_->track(i).video(), fragments ? -1 : film_->written(i)});
+        streams.push_back({film_->track(i).video(), film_->written(i)});
     const Any name = outStream()->getParam("outfilename");
-    const std::string problem = checkFilm(name, formFor(container_, extension()).container->format, streams);
+    const std::string problem = checkFilm(name, formFor(container_, extension()).container->format, streams,
+                                          makesFragments(settings_.avOptions));
     if (problem.empty()) return QvStatus::ok;
     return setError(QvStatus::failed, "%s was written, but can't be read again: %s", textOf(name).c_str(),
                     problem.c_str());

@@ -86,6 +86,8 @@ bool MuxTrack::fail(const std::string& why) {
 
 bool MuxTrack::choose(const MuxCodecRow* row, std::uint32_t fourcc) {
     if (!parameters_) return fail("there is no memory for it");
+    if (row && isSound(row->codec) == video_)
+        return fail(std::string(row->name) + " is no codec of " + (video_ ? "pictures" : "sound"));
     const bool fits = row && container_->takes(row->codec);
     if (!fits) {
         const std::string name = row ? row->name : std::string("'") + qvFourccText(fourcc).data() + "'";
@@ -374,24 +376,33 @@ bool MuxTrack::pass(PacketPtr unit, std::vector<PacketPtr>& out) {
     return true;
 }
 
-// The last unit of sound may be heard in part only, which is known at the end.
+// The last units of sound may be heard in part only, or not at all, which is known at the end.
 bool MuxTrack::hold(PacketPtr unit, std::vector<PacketPtr>& out) {
     if (container_->is(MuxTrait::counted) && unit->pts + unit->duration <= 0) return true;
-    if (held_) out.push_back(std::move(held_));
-    held_ = std::move(unit);
+    constexpr std::size_t most = 3;
+    held_.push_back(std::move(unit));
+    if (held_.size() > most) {
+        out.push_back(std::move(held_.front()));
+        held_.erase(held_.begin());
+    }
     return true;
 }
 
 bool MuxTrack::finish(std::vector<PacketPtr>& out) {
-    if (!held_) return true;
-    if (trailing_ > 0 && trailing_ < held_->duration) {
-        held_->duration -= trailing_;
-        std::uint8_t* const skip = av_packet_new_side_data(held_.get(), AV_PKT_DATA_SKIP_SAMPLES, 10);
+    if (held_.empty()) return true;
+    std::int64_t silent = trailing_;
+    for (; held_.size() > 1 && silent > 0 && silent >= held_.back()->duration; held_.pop_back())
+        silent -= held_.back()->duration;
+    AVPacket& last = *held_.back();
+    if (silent > 0 && silent < last.duration) {
+        last.duration -= silent;
+        std::uint8_t* const skip = av_packet_new_side_data(&last, AV_PKT_DATA_SKIP_SAMPLES, 10);
         if (!skip) return fail("there is no memory for a unit");
         std::memset(skip, 0, 10);
-        for (int i = 0; i < 4; ++i) skip[4 + i] = static_cast<std::uint8_t>(trailing_ >> 8 * i);
+        for (int i = 0; i < 4; ++i) skip[4 + i] = static_cast<std::uint8_t>(silent >> 8 * i);
     }
-    out.push_back(std::move(held_));
+    for (PacketPtr& unit : held_) out.push_back(std::move(unit));
+    held_.clear();
     return changed_.empty() || addOwnData(out);
 }
 

@@ -72,7 +72,7 @@ class MuxTrack {
     std::int64_t last_ = INT64_MIN;      // decoding time of the last unit
     std::int64_t next_ = 0;              // time of a unit that has none
     int trailing_ = 0;                   // samples that are not heard at the end
-    PacketPtr held_;                     // the last unit of sound
+    std::vector<PacketPtr> held_;        // the last units of sound
     std::vector<std::uint8_t> changed_;  // the codec's own data, where they were sent again
 
     bool fail(const std::string& why);

@@ -108,10 +108,21 @@ bool DecodedPictures::feed() {
     return true;
 }
 
+// Of JPEG 2000 only the container knows that a picture is two fields.
+void DecodedPictures::takeFields(AVFrame& picture) {
+    const AVCodecParameters& is = *stream().codecpar;
+    if (is.codec_id != AV_CODEC_ID_JPEG2000 || is.field_order <= AV_FIELD_PROGRESSIVE) return;
+    picture.interlaced_frame = 1;
+    picture.top_field_first = is.field_order == AV_FIELD_TT || is.field_order == AV_FIELD_BT;
+}
+
 DecodedPictures::Next DecodedPictures::next(AVFrame& picture) {
     for (;;) {
         const int result = avcodec_receive_frame(codec_.get(), &picture);
-        if (result >= 0) return Next::picture;
+        if (result >= 0) {
+            takeFields(picture);
+            return Next::picture;
+        }
         if (result == AVERROR_EOF) return Next::end;
         if (draining_ && result == AVERROR(EAGAIN)) return Next::end;
         if (result == AVERROR(ENOMEM)) {

@@ -40,6 +40,8 @@ class DecodedPictures {
     const std::string& failure() const { return failure_; }
 
   private:
+    void takeFields(AVFrame& picture);
+
     std::unique_ptr<MediaInput> input_;
     std::shared_ptr<const PacketIndex> index_;
     int stream_ = 0;

@@ -19,6 +19,7 @@ extern "C" {
 #include <libavutil/intreadwrite.h>
 #include <libavutil/mem.h>
 #include <libavutil/opt.h>
+#include <libavutil/parseutils.h>
 #include <libavutil/pixdesc.h>
 }
 #pragma GCC diagnostic pop

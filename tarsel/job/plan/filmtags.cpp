@@ -5,6 +5,7 @@
 #include <filesystem>
 #include <optional>
 
+#include "tarsel/source/wavwords.h"
 #include "tarsel/words/messages.h"
 #include "tarsel/words/xmlnames.h"
 
@@ -234,6 +235,12 @@ void checkTags(const OutputForm& output, const TagOptions& options) {
     const std::string option = !options.given.empty()       ? "--meta"
                                : !options.languages.empty() ? "--language"
                                                             : "";
+    if (output.kind == OutputKind::wav && !output.isStream() && options.languages.empty()) {
+        for (const std::string& word : options.given)
+            if (const std::string key = word.substr(0, word.find('=')); isKey(key) && !isWavWord(key))
+                throw failure(Msg::metaNoRoom, {"--meta " + key, output.name});
+        return;
+    }
     if (!option.empty() && output.kind != OutputKind::module && output.kind != OutputKind::nothing)
         throw failure(Msg::metaNoRoom, {option, output.name});
 }

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 
+#include "tarsel/source/wavwords.h"
 #include "tarsel/words/xmlnames.h"
 
 QvRatio InputStream::rate() const {
@@ -51,7 +52,11 @@ JobInput readInput(const Source& source) {
         readWords(decoder, qvAudioStream, i, stream);
         input.audio.push_back(stream);
     }
-    if (const Any meta = static_cast<const QvCodec&>(decoder).getParam("meta"); meta.isDict())
+    const auto& codec = static_cast<const QvCodec&>(decoder);
+    const Any meta = codec.getParam("meta"), chunks = codec.getParam("chunks");
+    if (meta.isDict())
         input.meta = meta.asDict();
+    else if (chunks.isVector())
+        input.meta = wavWords(chunks.asVector());
     return input;
 }

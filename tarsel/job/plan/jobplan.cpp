@@ -238,7 +238,8 @@ std::string planText(const JobPlan& plan) {
         if (stream.isRaw()) text += ", " + std::to_string(stream.bytes(stream.expected)) + " bytes";
         text += "\n";
     }
-    if (plan.output.kind == OutputKind::module && plan.tags && !plan.tags->empty())
+    if ((plan.output.kind == OutputKind::module || plan.output.kind == OutputKind::wav) && plan.tags &&
+        !plan.tags->empty())
         text += "meta    " + tagsText(*plan.tags) + "\n";
     if (plan.preset && !plan.preset->reason().empty())
         text += "preset  " + inQuotes(plan.preset->name()) + ", " + plan.preset->reason() + "\n";

@@ -160,7 +160,12 @@ void PresetPlanner::settle() {
         if (stream.isVideo() && !options_.encoders.sets("type"))
             takeForm(encoder, stream.picture.fourcc, !effects_.pixel.empty());
         setFormat(encoder, stream);
-        if (stream.isVideo()) setColours(stream, encoder);
+        if (stream.isVideo()) {
+            setColours(stream, encoder);
+            checkQuality(encoder);
+        } else {
+            setSoundRate(encoder, options_.encoders);
+        }
         encoder.store(stream.codec);
     }
 }

@@ -59,6 +59,63 @@ TEST_F(FilmTags, goIntoEachContainerThatHoldsThem) {
                 AllOf(HasSubstr("title     A\n"), HasSubstr("Two"), HasSubstr(", fra,")));
 }
 
+// Where a container has numbers for them, they are read as these.
+TEST_F(FilmTags, haveTimeAndPlaceOfTheirPictures) {
+    const Words words = {"--meta", "creation_time=2020-01-02T03:04:05.000000Z",
+                         "--meta", "location=+59.5000+018.2500/",
+                         "--meta", "album=Al"};
+    const struct {
+        const char *name, *lost;
+    } rows[] = {{"x.mp4", ""},
+                {"x.mov", ""},
+                {"x.mkv", ""},
+                {"x.m4a", ""},
+                {"x.mxf", "album, chapters, comment, location"}};
+    for (const auto& row : rows) {
+        Words all = {"transcode", "a.mkv", "-y", "-o", row.name};
+        all.insert(all.end(), words.begin(), words.end());
+        if (std::string(row.name) == "x.mxf")
+            all.insert(all.end(), {"--vcodec", "prores", "--samplerate", "48000"});
+        const Outcome o = tarsel(all);
+        EXPECT_EQ(o.status, 0) << o.err;
+        EXPECT_EQ(o.err.find("does not hold") == o.err.npos, !*row.lost) << o.err;
+        EXPECT_THAT(o.err, HasSubstr(row.lost));
+        EXPECT_THAT(shown(row.name), HasSubstr("2020-01-02T03:04:05")) << row.name;
+        if (!*row.lost) {
+            EXPECT_THAT(shown(row.name), testing::ContainsRegex("location  .59.5000.018.2500"));
+        }
+    }
+    const Outcome o = tarsel(
+        {"transcode", "a.mkv", "-o", "y.mp4", "--meta", "creation_time=then", "--meta", "location=here"});
+    EXPECT_THAT(o.err, HasSubstr("'y.mp4' does not hold: creation_time, location"));
+}
+
+// The texts of a WAV are those of a film, and the other way.
+TEST_F(FilmTags, goFromSoundFilesIntoFilmsAndBack) {
+    const auto probed = [this](const char* name) {
+        return runProgram({"/usr/bin/env", "ffprobe", "-v", "error", "-show_entries", "format_tags",
+                           folder.file(name)})
+            .out;
+    };
+    ASSERT_EQ(ffmpeg({"-f", "lavfi", "-i", "sine=duration=1", "-metadata", "title=Song", "-metadata",
+                      "artist=Ann", folder.file("a.wav")})
+                  .status,
+              0);
+    const Outcome o = tarsel({"transcode", "a.wav", "-o", "x.m4a"});
+    EXPECT_THAT(o.err, Not(HasSubstr("LIST")));
+    EXPECT_THAT(shown("x.m4a"), AllOf(HasSubstr("Song"), HasSubstr("Ann")));
+    made({"x.m4a", "--meta", "track=7", "-o", "b.wav"});
+    EXPECT_THAT(probed("b.wav"),
+                AllOf(HasSubstr("title=Song"), HasSubstr("artist=Ann"), HasSubstr("track=7")));
+    made({"a.wav", "--meta", "title=", "--meta", "album=Al", "-o", "c.wav"});
+    EXPECT_THAT(probed("c.wav"), AllOf(Not(HasSubstr("Song")), HasSubstr("artist=Ann"), HasSubstr("album=Al"),
+                                       HasSubstr("encoder=Lavf")));
+    made({"a.wav", "-o", "d.wav"});
+    EXPECT_EQ(probed("d.wav"), probed("a.wav"));
+    EXPECT_THAT(tarsel({"transcode", "a.wav", "--meta", "composer=x", "-o", "e.wav"}).err,
+                HasSubstr("no room"));
+}
+
 TEST_F(FilmTags, moveWithACut) {
     EXPECT_THAT(made({"a.mkv", "--from", "0.4", "-o", "x.mkv"}),
                 AllOf(HasSubstr("timecode  10:00:00:10\n"), HasSubstr(first + "One\n"),
@@ -68,6 +125,12 @@ TEST_F(FilmTags, moveWithACut) {
         AllOf(HasSubstr("timecode  10:00:01:05\n"), HasSubstr(first + "Two\n"), Not(HasSubstr("One"))));
     EXPECT_THAT(made({"a.mkv", "--from", "0.4", "--rate", "50", "-o", "x.mkv"}),
                 HasSubstr("timecode  10:00:00:20\n"));
+    // Each group of MPEG-2 has a timecode of its own.
+    made({"a.mkv", "--from", "0.4", "--vcodec", "mpeg2", "--no-audio", "-o", "x.m2v"});
+    EXPECT_THAT(runProgram({"/usr/bin/env", "ffprobe", "-v", "error", "-show_frames", "-show_entries",
+                            "frame_tags=timecode", folder.file("x.m2v")})
+                    .out,
+                AllOf(HasSubstr("timecode=10:00:00:10"), HasSubstr("timecode=10:00:00:20")));
     // A cut within a chapter makes none.
     EXPECT_THAT(made({"a.mkv", "--cut", "0-0.2", "--cut", "0.6-0.8", "--cut", "1.8-2", "-o", "x.mkv"}),
                 AllOf(HasSubstr(first + "One\n  chapter   0:00:00.400, Two\n"), HasSubstr("title     A\n")));

@@ -32,6 +32,8 @@ TEST_F(PresetFilms, areWhatTheirNamesSay) {
     } rows[] = {
         {"IPOD_H264_320x240", "a.mp4", "h264,320,240,1:1,progressive,30000/1001\n", "aac,48000,2"},
         {"3GP_MPEG4", "b.mp4", "mpeg4,176,144,12:11,unknown,15/1\n", "aac,48000,2"},
+        {"3GP_H263", "l.3gp", "h263,176,144,12:11,progressive,15/1\n", "aac,48000,2"},
+        {"3GP_H263", "m.mp4", "h263,176,144,12:11,progressive,15/1\n", "aac,48000,2"},
         {"VCD", "c.mpg", "mpeg1video,352,288,178:163,unknown,25/1\n", "mp2,44100,2"},
         {"BD_MPEG", "d.ts", "mpeg2video,1920,1080,1:1,tt,25/1", "ac3,48000,2"},
         {"DTV_ATSC_SD", "e.ts", "mpeg2video,704,480,10:11,tt,30000/1001", "ac3,48000,2"},

@@ -44,6 +44,9 @@ TEST_F(FilmJobs, areWhatTheirOptionsSay) {
          "codec_name=hevc"},
         {"g.mkv", "size=1280x720", {"--vcodec", "h265venc:preset=ultrafast,threads=40"}, "codec_name=hevc"},
         {"e.mxf", "size=1920x1080", {"--vcodec", "vc3venc", "--rate", "25i"}, "field_order=tt"},
+        {"h.mov", "size=720x576", {"--vcodec", "jpeg2000", "--rate", "25i"}, "field_order=tt"},
+        {"j.mkv", "size=320x240", {"--vcodec", "mpeg1"}, "codec_name=mpeg1video"},
+        {"i.avi", "size=352x288", {"--vcodec", "h263"}, "codec_name=h263"},
         {"f.mp4",
          "size=96x64",
          {"--vcodec", "h264venc:codecProfile=baseline", "--muxer",
@@ -125,6 +128,12 @@ TEST_F(FilmJobs, areRefusedWithTheEncodersOwnReason) {
         {{"--muxer", "mp4mux:avOptions=movflags=+faststart", "-o", "x.mp4"}, "parameter 'fastStart'"},
         {{"--vcodec", "vc3venc", "--size", "256x120", "--muxer", "mxfmux:seekable=0", "-o", "x.mxf"}, "pipe"},
         {{"--vcodec", "mpeg4venc:avOptions=threads=100000", "-o", "x.mkv"}, "own parameters decide"},
+        {{"--vcodec", "mpegvenc:vbr=0,vBitrate=50000000", "-o", "x.mkv"}, "filled up to 50000 kbit/s"},
+        {{"--vcodec", "mpeg4venc:standard=H.263", "-o", "x.mkv"}, "takes 128x96, 176x144"},
+        {{"--vcodec", "h263", "--size", "176x144", "-o", "x.ts"}, "does not"},
+        {{"--vcodec", "h264venc:codecProfile=high", "--crf", "0", "-o", "x.mkv"}, "no lossless"},
+        {{"--vcodec", "h264venc:codecProfile=baseline", "--rate", "25i", "-o", "x.mkv"}, "no interlaced"},
+        {{"--vcodec", "h264venc", "--crf", "-1", "-o", "x.mkv"}, "neither a quality nor a bit rate"},
     };
     for (const auto& row : rows) {
         const Outcome made = job("size=96x64", row.options);
@@ -132,6 +141,60 @@ TEST_F(FilmJobs, areRefusedWithTheEncodersOwnReason) {
         EXPECT_THAT(made.err, AllOf(HasSubstr(row.why), Not(HasSubstr("not described"))));
         EXPECT_FALSE(std::filesystem::exists(folder.file("x.mkv")));
     }
+}
+
+// Sound and pictures of a film in fragments begin together, and all of its units are counted.
+TEST_F(FilmJobs, beginTogetherInFragments) {
+    for (const char* options :
+         {"frag_duration=100000", "movflags=frag_keyframe", "movflags=+frag_every_frame"})
+        for (const auto& [name, muxer] : {std::pair("x.mp4", "mp4mux"), std::pair("x.mov", "movmux")}) {
+            SCOPED_TRACE(std::string(options) + name);
+            const Outcome made =
+                job("size=96x64", {"--muxer", std::string(muxer) + ":avOptions=" + options, "-o", name});
+            EXPECT_EQ(made.status, 0) << made.err;
+            EXPECT_THAT(facts(name), AllOf(HasSubstr("start_time=0.000000"), HasSubstr("start_time=-0.02")));
+        }
+}
+
+// Which rates of bits there are follows from the rate of samples and the channels, not from the usual ones.
+TEST_F(FilmJobs, haveTheBitRateOfTheirSoundOrNone) {
+    const struct {
+        Words options;
+        int status, bits;
+        const char* why;
+    } rows[] = {
+        {{"--acodec", "mp2", "--samplerate", "16000", "--audio-bitrate", "320k"}, 2, 0, "8k, 16k, 24k"},
+        {{"--acodec", "mp2", "--samplerate", "16000", "--audio-bitrate", "24k"}, 0, 24000, ""},
+        {{"--acodec", "mp2:aBitrate=384", "--samplerate", "16000"}, 2, 0, "aBitrate"},
+        {{"--acodec", "aac", "--samplerate", "8000", "--audio-bitrate", "512k"}, 2, 0, "32k, 48k, 64k, 96k"},
+        {{"--acodec", "aac", "--samplerate", "8000", "--audio-bitrate", "96k"}, 0, 0, ""},
+        {{"--acodec", "aac:aBitrate=96", "--samplerate", "8000", "--channels", "1"}, 2, 0, "aBitrate"},
+    };
+    for (const auto& row : rows) {
+        Words options = row.options;
+        options.insert(options.end(), {"--no-video", "-o", "x.mkv"});
+        const Outcome made = job("size=96x64", options);
+        EXPECT_EQ(made.status, row.status) << made.err;
+        EXPECT_THAT(made.err, HasSubstr(row.why));
+        if (row.bits > 0) {
+            EXPECT_THAT(facts("x.mkv"), HasSubstr("bit_rate=" + std::to_string(row.bits)));
+        }
+    }
+}
+
+// Why there is no VC-1, and what is known without a plug-in.
+TEST_F(FilmJobs, haveAReasonForEachModuleThatIsMissing) {
+    const std::string all = tarsel({"modules", "--missing"}).out;
+    EXPECT_THAT(all, AllOf(HasSubstr("\namraenc         audio encoder  libavcodec is packaged without"),
+                           HasSubstr("\nasfmux          multiplexer "), Not(HasSubstr("no plug-in"))));
+    const std::string present = tarsel({"modules"}).out;
+    std::istringstream lines(all);
+    for (std::string line; std::getline(lines, line);)
+        EXPECT_THAT("\n" + present, Not(HasSubstr("\n" + line.substr(0, line.find(' ')) + " "))) << line;
+    EXPECT_THAT(tarsel({"modules", "--missing", "vc1venc", "--json"}).out,
+                AllOf(HasSubstr("\"name\": \"vc1venc\""), HasSubstr("\"reason\": \"libavcodec reads VC-1")));
+    EXPECT_THAT(tarsel({"--no-plugins", "modules", "--missing", "h264venc"}).out, HasSubstr("no plug-in"));
+    EXPECT_EQ(tarsel({"modules", "--missing", "rawvenc"}).status, 2);
 }
 
 }  // namespace

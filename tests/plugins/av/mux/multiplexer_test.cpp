@@ -409,6 +409,8 @@ TEST_F(FilmWithSound, isRefusedWithAReason) {
     EXPECT_THAT(refused([](UnitSender& f) { f.streams[0].picture.codec = 0x31564646; }),
                 HasSubstr("Video stream #0: MP4 does not hold FFV1, but H.264"));
     EXPECT_THAT(refused([](UnitSender& f) { f.streams[0].picture.codec = 0x58585858; }), HasSubstr("'XXXX'"));
+    EXPECT_THAT(refused([](UnitSender& f) { f.streams[0].picture.codec = 0x20434141; }),
+                HasSubstr("AAC is no codec of pictures"));
     EXPECT_THAT(refused([](UnitSender& f) { f.streams[0].picture.version = 7; }), HasSubstr("version 7"));
     EXPECT_THAT(refused([](UnitSender& f) { f.streams[0].picture.rateNum = 0; }), HasSubstr("no frame rate"));
     EXPECT_THAT(refused([](UnitSender& f) { f.streams[0].picture.width = 1 << 30; }),
@@ -425,6 +427,23 @@ TEST_F(FilmWithSound, isRefusedWithAReason) {
     EXPECT_THAT(refused([](UnitSender& f) { f.units[5].pts = INT64_MAX - 5; }),
                 HasSubstr("a unit has the time"));
     EXPECT_THAT(refused([](UnitSender& f) { f.units.clear(); }), HasSubstr("there is nothing in it"));
+}
+
+// Units of which nothing is heard are not written.
+TEST_F(FilmWithSound, endsWhereItsSoundDoes) {
+    const auto heard = [&](int trailing) {
+        UnitSender from(file);
+        from.streams[1].sound.trailingPadding = trailing;
+        const std::string to = folder.file("cut.mp4");
+        EXPECT_EQ(mux("mp4mux", from, to), "");
+        return std::stoll(runProgram({"/usr/bin/env", "ffprobe", "-v", "error", "-select_streams", "a", "-of",
+                                      "csv=p=0", "-show_entries", "stream=duration_ts", to})
+                              .out);
+    };
+    const long long all = heard(0);
+    constexpr int millisecond = 48;  // the unit of the list of edits
+    for (const int trailing : {500, 1024, 1500, 2100})
+        EXPECT_NEAR(static_cast<double>(all - heard(trailing)), trailing, millisecond);
 }
 
 TEST_F(FilmWithSound, keepsItsWordsAndNamesWhatIsLost) {
