@@ -391,6 +391,7 @@ enum class Msg : unsigned short {
     batchEmpty,
     // batches on a cluster
     schedulerRefuses,
+    schedulerGarbled,
     schedulerWord,
     schedulerOwnOption,
     schedulerPartly,

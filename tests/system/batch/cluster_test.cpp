@@ -72,6 +72,7 @@ class FakeSlurm : public Cluster {
         fs::create_directory(folder.path() / "bin");
         program("sbatch", R"(n=$(($(cat "$S/count") + 1)); [ ! -e "$S/refuse$n" ] || {
             echo "sbatch: error: no such partition" >&2; exit 1; }
+            [ ! -e "$S/mute" ] || exit 0
             echo $n >"$S/count"; printf '%s\n' "$@" >"$S/arguments$n"; cat >"$S/script$n"
             for word; do case $word in --job-name=*) name=${word#*=};; --array=*) last=${word##*-};; esac; done
             for k in $(seq 0 ${last%%%*}); do echo "$name|$n|$k|PENDING" >>"$S/queue"; done; echo $n)");
@@ -129,13 +130,14 @@ TEST_F(FakeSlurm, WhatWaitsForOthersIsInLaterArrays) {
 }
 
 TEST_F(FakeSlurm, AnElementRunsItsTask) {
-    const std::string list = "it's \"$(touch hacked)\"\n#SBATCH --hold\n%j.xml";
+    const std::string list = "it's \"$(touch hacked)\"\r\n#SBATCH --hold\n%j.xml";
     works({"batch", list, "new"});
     const std::string out = "o' $(touch hacked).wav";
     works({"batch", list, "add", "in.wav", "-o", "first.wav"});
     works({"batch", list, "add", "in.wav", "-o", out, "--bits", "24"});
     works({"batch", list, "add", out, "-o", "last.wav", "--bits", "16"});
     EXPECT_EQ(tarsel({"batch", list, "submit", "--slurm"}, surroundings()).status, 0);
+    EXPECT_THAT(contents("bin/script1"), Not(HasSubstr("\r\n"))) << "which sbatch refuses";
     EXPECT_THAT(argument(1, "--output="), HasSubstr("it's \"$(touch hacked)\""));
     // One whose input was not made has failed, also where an old file has its name.
     makeWav(out, 10);
@@ -193,6 +195,8 @@ TEST_F(FakeSlurm, OneThatRefusesOrIsSilent) {
     } rows[] = {{{"--", "script.sh"}, 2, "--partition=NAME"},
                 {{"--", "--arr=1-9"}, 2, "can't be given"},
                 {{"--", "-Jname"}, 2, "can't be given"},
+                {{"--", "-HvJname"}, 2, "can't be given"},
+                {{"--", "-Q"}, 2, "can't be given"},
                 {{"--array-size", "1001"}, 2, "1001"},
                 {{"--jobs", "0"}, 2, "--jobs"},
                 {{"-y", "-n"}, 2, "-n"}};
@@ -202,11 +206,24 @@ TEST_F(FakeSlurm, OneThatRefusesOrIsSilent) {
     failsAs(1, submit(), {"'sbatch' refuses", "no such partition"}, "refuse");
     EXPECT_EQ(count("waiting"), 3u);
     fs::remove(folder.file("bin/refuse1"));
+    folder.write("bin/mute", "");
+    failsAs(1, submit(), {"'sbatch' refuses: it says nothing"}, "mute");
+    fs::remove(folder.file("bin/mute"));
+    EXPECT_EQ(count("waiting"), 3u);
     folder.write("bin/refuse3", "");
     failsAs(1, submit({"--array-size", "1"}), {"in part: after 2 of 3 tasks", "no such partition"}, "partly");
     EXPECT_EQ(count("queued"), 2u);
     EXPECT_EQ(count("waiting"), 1u);
-    // Without an answer nothing is submitted, as it may be in the queue.
+    // Without a whole answer nothing is submitted, as it may be in the queue.
+    const std::string whole = contents("bin/queue");
+    const size_t second = whole.find('\n') + 1;
+    for (const std::string& cut : {whole.substr(0, second + 5), whole.substr(0, whole.find('|')) + "\n"}) {
+        setQueue(cut);
+        failsAs(1, submit(), {"can't read what 'squeue' says"}, cut);
+    }
+    setQueue("hello\n" + whole);
+    EXPECT_EQ(count("queued"), 2u);
+    setQueue(whole);
     folder.write("bin/silent", "");
     failsAs(1, submit(), {"'squeue' refuses", "no contact"}, "silent");
     EXPECT_THAT(batch({"status"}).err, HasSubstr("no contact"));
@@ -221,26 +238,27 @@ TEST_F(FakeSlurm, OneThatRefusesOrIsSilent) {
     failsAs(5, submit(), {"can't start 'squeue'"}, "no Slurm");
 }
 
-// 2,100 tasks are three arrays; a hand-made list costs less than as many runs of the tool.
+// 2,001 tasks are three arrays; a hand-made list costs less than as many runs of the tool.
 TEST_F(FakeSlurm, ArraysHaveAThousandTasks) {
     addTasks(1, 1);
     const std::string list = contents("l.xml");
     const size_t from = list.find("<TranscodeTask"), to = list.rfind("</TranscodeTask>") + 16;
     const std::string one = list.substr(from, to - from);
     std::string all = list.substr(0, from);
-    for (int n = 1; n <= 2100; ++n) {
+    for (int n = 1; n <= 2001; ++n) {
         std::string task = one;
         for (size_t at; (at = task.find("/1.wav")) != std::string::npos;)
             task.replace(at, 6, "/n" + std::to_string(n) + ".wav");
         all += task;
     }
     folder.write("l.xml", all + list.substr(to));
-    EXPECT_THAT(submit().err, HasSubstr("2100 tasks submitted as jobs 1, 2, 3"));
+    EXPECT_THAT(submit().err, HasSubstr("2001 tasks submitted as jobs 1, 2, 3"));
     EXPECT_EQ(argument(1, "--array="), "0-999");
-    EXPECT_EQ(argument(3, "--array="), "0-99");
-    EXPECT_EQ(queue().size(), 2100u);
-    EXPECT_EQ(element(3, 99).status, 0);
-    EXPECT_TRUE(fs::exists(folder.file("n2100.wav")));
+    EXPECT_EQ(argument(2, "--array="), "0-999");
+    EXPECT_EQ(argument(3, "--array="), "0-0");
+    EXPECT_EQ(queue().size(), 2001u);
+    EXPECT_EQ(element(3, 0).status, 0);
+    EXPECT_TRUE(fs::exists(folder.file("n2001.wav")));
 }
 
 // --- Slurm itself
