@@ -35,7 +35,11 @@ std::vector<TaskArray> arraysOf(const std::vector<TaskPlace>& places,
 
 std::string shellWord(const std::string& text) {
     std::string word = "'";
-    for (const char c : text) word += c == '\'' ? std::string("'\\''") : std::string(1, c);
+    for (const char c : text) {
+        // sbatch takes CR and LF side by side for a script of DOS and refuses it; '' between them is nothing.
+        if (c == '\n' && word.back() == '\r') word += "''";
+        word += c == '\'' ? std::string("'\\''") : std::string(1, c);
+    }
     return word + "'";
 }
 

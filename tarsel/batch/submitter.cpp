@@ -118,11 +118,17 @@ std::string Submitter::submitArray(const TaskArray& array) {
         return scheduler_.submit(wanted);
     } catch (const Failure&) {
         // One that did not answer in time may have taken it.
-        if (isUnknown(wanted.name)) {
-            submissions_.keep(before);
-            removeFiles(wanted.name);
-        }
+        if (isUnknown(wanted.name)) forget(wanted.name, before);
         throw;
+    }
+}
+
+// On a disk that is full the files make room; if it still is, the next submission forgets the array.
+void Submitter::forget(const std::string& array, const std::vector<std::string>& others) {
+    removeFiles(array);
+    try {
+        submissions_.keep(others);
+    } catch (const Failure&) {
     }
 }
 

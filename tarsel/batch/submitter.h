@@ -37,6 +37,7 @@ class Submitter {
     std::vector<TaskPlace> places();
     std::string newName();
     std::string submitArray(const TaskArray& array);
+    void forget(const std::string& array, const std::vector<std::string>& others);
     bool isUnknown(const std::string& name) const;
 
     const BatchFile& file_;

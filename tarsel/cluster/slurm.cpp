@@ -5,6 +5,7 @@
 #include <optional>
 #include <set>
 #include <sstream>
+#include <string_view>
 
 #include "tarsel/host/command.h"
 #include "tarsel/words/messages.h"
@@ -25,21 +26,21 @@ const Words& ownVariables() {
 }
 
 // Options of sbatch that are this tool's own, or after which the array is none that it can follow.
-constexpr struct {
-    const char *shortName, *longName;
-} kOwnOptions[] = {
-    {"-J", "--job-name"},    {"-a", "--array"},        {"-d", "--dependency"},
-    {"-M", "--clusters"},    {"-W", "--wait"},         {nullptr, "--wrap"},
-    {nullptr, "--parsable"}, {nullptr, "--test-only"}, {"-h", "--help"},
-    {nullptr, "--usage"},    {"-V", "--version"},      {nullptr, "--no-kill-on-invalid-dep"},
+constexpr std::string_view kOwnLetters = "JadMWhVQ";
+constexpr std::string_view kOwnOptions[] = {
+    "--job-name", "--array",    "--dependency", "--clusters", "--wait", "--help",  "--usage",
+    "--version",  "--parsable", "--test-only",  "--quiet",    "--wrap", "--jobid", "--no-kill-on-invalid-dep",
 };
-constexpr size_t kShortestPrefix = 4;  // of a long option that getopt takes for the whole
+constexpr std::string_view kPlainLetters = "bHIkOsuv";  // options without a value, so that others may follow
+constexpr size_t kShortestPrefix = 4;                   // of a long option that getopt takes for the whole
 
-bool isOwn(const std::string& word) {
-    const std::string name = word.substr(0, word.find('='));
-    return std::any_of(std::begin(kOwnOptions), std::end(kOwnOptions), [&](const auto& own) {
-        if (own.shortName && word.starts_with(own.shortName)) return true;
-        const std::string whole = own.longName;
+bool isOwn(std::string_view word) {
+    if (!word.starts_with("--")) {
+        const size_t last = std::min(word.find_first_not_of(kPlainLetters, 1), word.size() - 1);
+        return kOwnLetters.find(word[last]) != std::string_view::npos;
+    }
+    const std::string_view name = word.substr(0, word.find('='));
+    return std::any_of(std::begin(kOwnOptions), std::end(kOwnOptions), [&](std::string_view whole) {
         return name.size() >= kShortestPrefix && whole.starts_with(name);
     });
 }
@@ -70,10 +71,13 @@ Answer ask(const Words& words, const std::string& input, double seconds) {
     return askProgram(words, input, seconds, ownVariables());
 }
 
+[[noreturn]] void refuse(const std::string& program, const std::string& text) {
+    throw failure(Msg::schedulerRefuses, {program, text.empty() ? "it says nothing" : inLine(text)});
+}
+
 Answer askSurely(const Words& words, const std::string& input, double seconds) {
     Answer answer = ask(words, input, seconds);
-    const std::string why = answer.err.empty() ? "it says nothing" : inLine(answer.err);
-    if (answer.status != 0) throw failure(Msg::schedulerRefuses, {words[0], why});
+    if (answer.status != 0) refuse(words[0], answer.err);
     return answer;
 }
 
@@ -105,7 +109,7 @@ std::string SlurmScheduler::submit(const ClusterArray& array) const {
     const Answer answer = askSurely(words, array.script, kPatience);
     // "123" or "123;cluster"
     const std::string job = answer.out.substr(0, answer.out.find_first_of(";\n"));
-    if (!indexOf(job)) throw failure(Msg::schedulerRefuses, {words[0], inLine(answer.out + answer.err)});
+    if (!indexOf(job)) refuse(words[0], answer.out + answer.err);
     return job;
 }
 
@@ -115,11 +119,14 @@ std::vector<ClusterElement> SlurmScheduler::elements(const Words& arrays) const 
     const std::set<std::string> wanted(arrays.begin(), arrays.end());
     const Answer answer =
         askSurely({"squeue", "--noheader", "--array", "--format=%j|%F|%K|%T"}, "", kQuestionPatience);
+    // One that is left out would be submitted again, so an answer that was cut is none.
+    if (!answer.out.empty() && answer.out.back() != '\n') throw failure(Msg::schedulerGarbled, {"squeue"});
     for (const std::string& line : fieldsOf(answer.out, '\n')) {
         const Words fields = fieldsOf(line, '|');
-        if (fields.size() != 4 || !wanted.count(fields[0])) continue;
-        if (const auto index = indexOf(fields[2]))
-            elements.push_back({fields[0], fields[1], *index, fields[3] == "PENDING"});
+        if (fields.empty() || !wanted.count(fields[0])) continue;
+        const auto index = fields.size() == 4 && indexOf(fields[1]) ? indexOf(fields[2]) : std::nullopt;
+        if (!index) throw failure(Msg::schedulerGarbled, {"squeue"});
+        elements.push_back({fields[0], fields[1], *index, fields[3] == "PENDING"});
     }
     return elements;
 }

@@ -402,6 +402,7 @@ constexpr Message kMessages[] = {
     {Msg::batchEmpty,          Exit::input,  "can't run {file}",                      "it has no tasks",                                           "add some with 'tarsel batch LIST add'"},
     // batches on a cluster
     {Msg::schedulerRefuses,    Exit::failed, "{file} refuses",                        "{system}",                                                  "correct what it names, or ask those who run the cluster"},
+    {Msg::schedulerGarbled,    Exit::failed, "can't read what {file} says",           "an element of the list is not whole in it",                 "try it by hand, and take away what changes its words"},
     {Msg::schedulerWord,       Exit::usage,  "{name} is no option of the scheduler",  "each word after -- begins with '-'",                        "write a value as a part of its option, as --partition=NAME"},
     {Msg::schedulerOwnOption,  Exit::usage,  "{name} can't be given",                 "the tool sets it itself, or could not find its tasks again", "leave it out"},
     {Msg::schedulerPartly,     Exit::failed, "{file} is submitted in part",           "after {text} of {text} tasks {text}",                       "submit again when that is solved; what is queued is left as it is"},

@@ -402,6 +402,7 @@ enum class Msg : unsigned short {
     batchEmpty,
     // batches on a cluster
     schedulerRefuses,
+    schedulerGarbled,
     schedulerWord,
     schedulerOwnOption,
     schedulerPartly,

@@ -1,9 +1,11 @@
 #include "tarsel/host/outputs/recordfile.h"
 
 #include <cerrno>
+#include <chrono>
 #include <cstdint>
 #include <cstdio>
 #include <filesystem>
+#include <thread>
 
 #include <fcntl.h>
 #include <sys/file.h>
@@ -18,6 +20,8 @@ namespace fs = std::filesystem;
 namespace {
 
 constexpr size_t kSumDigits = 16;
+constexpr int kLockTries = 250;
+constexpr std::chrono::milliseconds kLockPause{20};
 constexpr size_t kMostBytes = size_t{1} << 30;  // of a file; what is longer was not written here
 
 // FNV-1a of 64 bits.
@@ -191,13 +195,15 @@ std::vector<std::string> RecordFile::read(const std::string& name) {
 
 NamedLock::NamedLock(const std::string& name, const std::string& shown) : file_(openShared(name)) {
     int error = flockFor(file_.get(), LOCK_EX | LOCK_NB);
-    if (error == EWOULDBLOCK) {
+    for (int tries = 0; error == EWOULDBLOCK; ++tries) {
         const auto owner = Owner::parse(contentsOf(file_.get()));
-        // What a killed one has left takes a moment to go.
-        if (!owner || owner->state() != Owner::State::gone)
+        // What a killed one has left takes a moment to go, and one that begins takes one to say who it is.
+        const bool settled = owner && owner->state() != Owner::State::gone;
+        if (settled || tries == kLockTries)
             throw failure(Msg::batchRuns, {shown, owner ? std::to_string(owner->pid) : "?",
                                            owner ? owner->host : "another host"});
-        error = flockFor(file_.get(), LOCK_EX);
+        std::this_thread::sleep_for(kLockPause);
+        error = flockFor(file_.get(), LOCK_EX | LOCK_NB);
     }
     if (error != 0) refuse(name, error);
     if (ftruncate(file_.get(), 0) != 0 || !writeAll(file_.get(), Owner::self().text())) refuse(name, errno);
