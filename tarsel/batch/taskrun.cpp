@@ -11,6 +11,7 @@
 #include "tarsel/host/outputs/recovery.h"
 #include "tarsel/job/job.h"
 #include "tarsel/job/storedjob.h"
+#include "tarsel/split/split.h"
 #include "tarsel/job/task/taskfiles.h"
 #include "tarsel/words/messages.h"
 
@@ -94,6 +95,7 @@ void TaskRun::carryOut(const BatchFile& file, const BatchTask& task, const Outpu
         for (const std::string& log : logs) one.warnings.push_back(lineOf(Msg::taskLogLeft, {shown, log}));
         auto stored = std::make_unique<StoredTask>(state, shown);
         openStoredJob(*stored, one, allowPost);
+        one.division = storedSplit(*stored);
         return std::make_unique<Job>(one, std::move(stored), signals);
     });
 }

@@ -24,12 +24,12 @@ void run(Given& given, Signals& signals) {
     given.job.policy = given.outputs.policy();
     given.job.policy.recover = !given.job.dryRun;
     given.job.policy.quiet = given.job.quiet;
-    if (!given.split.empty()) given.job.division = makeSplit(given.split);
     runJob(given.job, [&] {
         JobOptions job = given.job;
         job.output = given.output;
         auto task = std::make_unique<StoredTask>(given.task);
         openStoredJob(*task, job, given.allowPost);
+        job.division = given.split.empty() ? storedSplit(*task) : makeSplit(given.split);
         return std::make_unique<Job>(job, std::move(task), signals);
     });
 }

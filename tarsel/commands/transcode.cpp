@@ -23,7 +23,7 @@ namespace {
 struct Given : GivenJob {
     OutputOptions outputs;
     ProgressOption progress;
-    std::string threads, inputFormat, split;
+    std::string threads, inputFormat;
 };
 
 int parseBits(const std::string& text) {
@@ -109,12 +109,6 @@ void takeStandardInput(Given& given) {
         throw failure(Msg::stdinRefuses, {"--post with %i"});
 }
 
-void takeSplit(Given& given) {
-    if (given.split.empty()) return;
-    if (given.job.standardInput) throw failure(Msg::stdinRefuses, {"--split"});
-    given.job.division = makeSplit(given.split);
-}
-
 }  // namespace
 
 void resolveJob(GivenJob& given) {
@@ -129,6 +123,10 @@ void resolveJob(GivenJob& given) {
     if (!given.channels.empty())
         job.channels = static_cast<int>(parseNumber(given.channels, 1, 8, "--channels"));
     if (!given.bits.empty()) job.bits = parseBits(given.bits);
+    if (!given.split.empty()) {
+        if (job.standardInput) throw failure(Msg::stdinRefuses, {"--split"});
+        job.division = makeSplit(given.split);
+    }
     parseMuxer(job);
     choosePreset(given);
     checkMuxer(job);
@@ -154,7 +152,6 @@ void transcode(Given& given, Signals& signals) {
     job.policy.quiet = job.quiet;
     takeStandardInput(given);
     resolveJob(given);
-    takeSplit(given);
     runJob(given.job, [&] { return std::make_unique<Job>(given.job, signals); });
 }
 
@@ -227,6 +224,7 @@ void addJobOptions(Command& command, GivenJob& given, Need inputs) {
                    "A command run afterwards; %i and %o stand for the inputs and outputs, %o1 for the first",
                    "CMD");
     command.flag("--split-channels", job.splitChannels, "One WAV file a channel");
+    command.option("--split", given.split, "Make the picture in N parts, side by side", "N");
     command.flag("--accept-partial", job.acceptPartial, "Accept a damaged input and take what can be read");
     addSoundOptions(command, job.sound);
     addEffectOptions(command, job.effects);
@@ -245,7 +243,6 @@ void addTranscode(CommandLine& line, Signals& signals, const std::string& versio
     given->progress.add(command);
     command.flag("--strict", job.strict, "Let the job fail if there is a warning");
     command.flag("--unchanged", job.unchanged, "Let the job fail if an INPUT changes while it is read");
-    command.option("--split", given->split, "Make the picture in N parts, side by side", "N");
     addThreads(command, given->threads);
     command.flag("--dry-run", job.dryRun, "Print the plan and do nothing");
     given->outputs.add(command);

@@ -9,7 +9,7 @@
 // Options as they were given; they are parsed once the command runs.
 struct GivenJob {
     JobOptions job;
-    std::string samplerate, channels, bits;
+    std::string samplerate, channels, bits, split;
     std::string vcodec, acodec;  // NAME[:key=value,...]
 };
 

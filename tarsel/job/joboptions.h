@@ -46,6 +46,8 @@ class JobDivision {
     };
 
     virtual ~JobDivision() = default;
+    // How many were asked for. A task keeps it as "split".
+    virtual int parts() const = 0;
     // Before any work. Throws Failure for a job that can't be divided.
     virtual void plan(const JobPlan& plan) = 0;
     // What --dry-run prints of it: lines.

@@ -54,6 +54,8 @@ AnyDict storedState(JobParts& parts, const JobOptions& options) {
     AnyDict state =
         parts.stored ? static_cast<const AnyDict&>(parts.stored->state()) : newState(parts, options);
     if (!options.post.empty()) state.set("postProcess", options.post.c_str());
+    state.remove(kSplitKey);
+    if (options.division) state.set(kSplitKey, options.division->parts());
     makeAbsolute(state);
     requireNames(state, options);
     return state;

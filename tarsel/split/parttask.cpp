@@ -3,6 +3,7 @@
 #include <algorithm>
 
 #include "tarsel/job/task/divide.h"
+#include "tarsel/job/task/storedtask.h"
 
 namespace {
 
@@ -28,6 +29,7 @@ void setOutput(AnyDict& state, AnyDict encoder, const std::string& output) {
     state.set("encoder", encoder);
     state.set("filename", output.c_str());
     state.remove("postProcess");
+    state.remove(kSplitKey);
 }
 
 // The first frame of the part in the numbers of the input, and as an instant of it.

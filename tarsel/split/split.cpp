@@ -9,7 +9,6 @@
 #include "tarsel/host/files.h"
 #include "tarsel/host/outputs/workfolder.h"
 #include "tarsel/job/progress.h"
-#include "tarsel/job/task/storedtask.h"
 #include "tarsel/job/warnings.h"
 #include "tarsel/split/localparts.h"
 #include "tarsel/split/partjoin.h"
@@ -21,7 +20,7 @@ namespace fs = std::filesystem;
 
 namespace {
 
-constexpr int kMostParts = 10000;
+constexpr int kLeastParts = 2, kMostParts = 10000;
 constexpr double kSoundWeight = 0.03;  // of the sound, as a share of the picture's
 constexpr double kJoinWeight = 0.05;   // of putting the parts together, as a share of all
 
@@ -29,6 +28,7 @@ class Split : public JobDivision {
   public:
     explicit Split(int parts) : wanted_(parts) {}
 
+    int parts() const override { return wanted_; }
     void plan(const JobPlan& plan) override;
     std::string text() const override;
     std::vector<long long> run(const Given& given) override;
@@ -207,5 +207,11 @@ ProgressState Split::now() const {
 }  // namespace
 
 std::shared_ptr<JobDivision> makeSplit(const std::string& parts) {
-    return std::make_shared<Split>(static_cast<int>(parseNumber(parts, 2, kMostParts, "--split")));
+    return std::make_shared<Split>(static_cast<int>(parseNumber(parts, kLeastParts, kMostParts, "--split")));
+}
+
+// A number that is none comes from another program, whose task can be made in one piece.
+std::shared_ptr<JobDivision> storedSplit(const StoredTask& task) {
+    const int parts = task.raw().getInt32(kSplitKey, 0);
+    return parts >= kLeastParts && parts <= kMostParts ? std::make_shared<Split>(parts) : nullptr;
 }

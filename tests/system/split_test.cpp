@@ -90,6 +90,16 @@ TEST_F(SplitJob, AStoredTaskAndThePlan) {
                                              "part    3: frames 200 to 299\npart    4: frames 300 to 358\n"
                                              "part    5: the sound\n"));
     EXPECT_EQ(size("c.avi"), -1);
+
+    // A task of a batch keeps the number of parts, and its parts do not.
+    works({"batch", "l.xml", "new"});
+    const std::string clip = "testgen:size=64x48,rate=25,duration=1";
+    works({"batch", "l.xml", "add", clip, "-o", "d.avi", "--split", "2"});
+    works({"transcode", clip, "-o", "e.avi", "--split", "2", "--save-task", "e.xml"});
+    EXPECT_THAT(works({"run", "e.xml", "--dry-run", "-y"}).out,
+                testing::HasSubstr("part    2: frames 12 to 24\n"));
+    works({"batch", "l.xml", "run"});
+    EXPECT_TRUE(contents("d.avi") == contents("e.avi"));
 }
 
 TEST_F(SplitJob, WhatCanNotBeDividedIsRefused) {

@@ -9,6 +9,9 @@
 
 #include "tarsel/source/source.h"
 
+// The key of a task that is made in so many parts.
+inline constexpr char kSplitKey[] = "split";
+
 class StoredTask {
   public:
     // Reads and checks the file. Relative names in it count from its folder. Throws Failure.
