@@ -24,6 +24,7 @@
 #include "core/value/any.h"
 #include "core/value/anycontainer.h"
 #include "plugins/av/decoder/avdec.h"
+#include "plugins/av/source/librarylog.h"
 #include "tests/support/engine.h"
 
 namespace {
@@ -121,6 +122,7 @@ int main(int count, char** words) {
         return 2;
     }
     const EngineScope engine;
+    av::sendLibraryLog();
     av::AvDec film;
     film.setParam("filename", Any(words[1]));
     if (film.init() != 0 || film.open() != 0) {

@@ -137,7 +137,7 @@ DecodedPictures::Next DecodedPictures::next(AVFrame& picture) {
 bool DecodedPictures::isConcealed(const AVFrame& picture, std::size_t packet) const {
     // With threads of frames flags may be set too late; see ConcealedPackets.
     const bool late = (codec_->active_thread_type & FF_THREAD_FRAME) != 0;
-    const int flags = late ? 0 : picture.decode_error_flags & ~FF_DECODE_ERROR_CONCEALMENT_ACTIVE;
+    const int flags = late ? 0 : picture.decode_error_flags;
     return flags != 0 || (picture.flags & AV_FRAME_FLAG_CORRUPT) != 0 || concealed_.has(packet);
 }
 

@@ -14,11 +14,11 @@ inline constexpr unsigned streams = 256;
 inline constexpr int side = 16384;                      // of a picture, in pixels
 inline constexpr std::int64_t pixels = 16384LL * 8640;  // of a picture
 inline constexpr int channels = 64;
-inline constexpr int samplerate = 768'000;                       // Hz
-inline constexpr std::size_t allocation = std::size_t{1} << 30;  // one block of the libraries
-inline constexpr std::size_t packets = std::size_t{64} << 20;    // of a file
+inline constexpr int samplerate = 768'000;                           // Hz
+inline constexpr std::size_t allocation = std::size_t{1} << 30;      // one block of the libraries
+inline constexpr std::size_t packets = std::size_t{64} << 20;        // of a file
 inline constexpr std::size_t subtitleBytes = std::size_t{64} << 20;  // of a stream
-inline constexpr int frames = 0x3fffffff;                        // of a stream
+inline constexpr int frames = 0x3fffffff;                            // of a stream
 inline constexpr int variableFrames = 64 << 20;  // of a stream of variable rate, which needs a table
 
 }  // namespace av::limits

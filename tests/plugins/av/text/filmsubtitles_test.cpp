@@ -1,8 +1,11 @@
 // Text subtitles of films: shown, written in other forms and burnt in.
 #include <gmock/gmock.h>
 
+#include "core/engine/status.h"
+#include "plugins/av/decoder/avdec.h"
 #include "plugins/av/text/eventtext.h"
 #include "tests/plugins/av/films.h"
+#include "tests/support/engine.h"
 
 namespace {
 
@@ -120,6 +123,29 @@ TEST_F(FilmSubtitles, areThoseOfTheFilesTheyCameFrom) {
     EXPECT_TRUE(read("film.i420") == film);
     EXPECT_EQ(tarsel({"transcode", "x.mkv", "-y", "--subtitles", "b.srt", "-o", "file.i420"}).status, 0);
     EXPECT_TRUE(read("file.i420") == film);
+}
+
+TEST_F(FilmSubtitles, goWithTheFramesOfTheirFilm) {
+    const EngineScope engine;
+    av::AvDec film;
+    film.setParam("filename", Any(folder.file(filmWith("x.mkv", "srt", {"-c:v", "mpeg4"})).c_str()));
+    ASSERT_EQ(film.open(), QvStatus::ok) << film.errorDesc();
+    ASSERT_EQ(film.nrStreams(qvSubpicStream), 2);
+    EXPECT_EQ(film.duration(qvSubpicStream, 0), MediaTime(1.48));
+    const struct {
+        int frame, stream;
+        const char* text;  // null: nothing is shown
+    } cases[] = {{0, 0, nullptr},    {5, 0, "One <i>and</i>|two"},
+                 {15, 1, "Deux"},    {18, 0, nullptr},
+                 {37, 0, "A & b c"}, {38, 0, nullptr},
+                 {10, 1, "Deux"},    {9, 1, nullptr}};
+    for (const auto& c : cases) {
+        ASSERT_EQ(film.seek(MediaTime(c.frame / 25.0), qvSubpicStream, c.stream), QvStatus::ok);
+        ASSERT_EQ(film.readFrame(0), QvStatus::ok);
+        AnyDict shown;
+        EXPECT_EQ(film.readMeta(c.stream, 0, shown) == QvStatus::ok, c.text != nullptr) << c.frame;
+        EXPECT_STREQ(shown.getString("text", ""), c.text ? c.text : "") << c.frame;
+    }
 }
 
 TEST_F(FilmSubtitles, thatAreNotThereAreNamed) {
