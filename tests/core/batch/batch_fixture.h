@@ -5,6 +5,7 @@
 #include <condition_variable>
 #include <functional>
 #include <mutex>
+#include <optional>
 #include <stdexcept>
 #include <string>
 #include <utility>
@@ -35,6 +36,13 @@ class BatchNotes : public QvBatchProcessCb {
         for (std::size_t at = notes.find(text); at != std::string::npos; at = notes.find(text, at + 1))
             ++found;
         return found;
+    }
+
+    // Calls the action on each report of this text, in place of any former hook.
+    void when(const std::string& report, const std::function<void()>& action) {
+        hook = [=](const std::string& text) {
+            if (text == report) action();
+        };
     }
 
     std::function<void(const std::string&)> hook;
@@ -84,15 +92,17 @@ class BatchNotes : public QvBatchProcessCb {
 
 class BatchTest : public JoinedTask {
   protected:
-    // Sound alone, each file a segment of it.
-    QvTaskState task(const std::string& out, const std::vector<AnyDict>& files) const {
+    // Only sound, or only pictures; each file is a segment.
+    QvTaskState task(const std::string& out, const std::vector<AnyDict>& files, int type = qvAudioStream,
+                     const std::optional<InOutPoints>& points = {}) const {
         QvTaskState made;
         made.set("__class__", "TranscodeTask");
-        made.set("encoder", output(1, QvFramerate(0.0)));
+        made.set("encoder", type == qvAudioStream ? output(1, QvFramerate(0.0)) : output(0));
         made.setOutputFilename(folder_.file(out).c_str());
-        made.set("streams", AnyVector(AnyDict("type", 2)));
+        made.set("streams", AnyVector(AnyDict("type", type)));
         made.set("segments", AnyVector());
-        for (const AnyDict& file : files) made.addSegment(AnyVector(source(2, file)), AnyVector(file));
+        for (const AnyDict& file : files)
+            made.addSegment(AnyVector(source(type, file, points)), AnyVector(file));
         return made;
     }
     QvTaskState good(int number) const { return task("out" + std::to_string(number) + ".x", {wav_}); }
