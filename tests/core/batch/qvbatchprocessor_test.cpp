@@ -327,13 +327,18 @@ TEST_F(QvBatchProcessorTest, TheLengthOfJoinedVideosCountsAsAWhole) {
 TEST_F(QvBatchProcessorTest, APauseWithinATaskHoldsIt) {
     list_.append(good(0));
     processor_.init(list_);
-    notes_.when("seg0.0", [&] { processor_.pause(); });
+    bool afterwards = true;
+    notes_.hook = [&](const std::string& text) {
+        if (text == "seg0.0") processor_.pause();
+        if (text == "segdone0.0:0") afterwards = processor_.isPaused();
+    };
     ASSERT_EQ(processor_.start(false, &notes_), 0);
     notes_.waitFor("paused");
     EXPECT_TRUE(processor_.isPaused());
     EXPECT_TRUE(processor_.isRunning());
     processor_.unpause();
     notes_.waitFor("end");
+    EXPECT_FALSE(afterwards);
     EXPECT_FALSE(processor_.isPaused());
     EXPECT_EQ(notes_.take(), "begin task0 init0.0:0 seg0.0 paused resumed segdone0.0:0 done0:0 end");
 }
