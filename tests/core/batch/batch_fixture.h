@@ -2,34 +2,20 @@
 #pragma once
 
 #include <atomic>
-#include <condition_variable>
 #include <functional>
-#include <mutex>
 #include <optional>
 #include <stdexcept>
 #include <string>
-#include <utility>
 #include <vector>
 
 #include "core/batch/qvbatchprocessor.h"
 #include "tests/core/transcode/batch/joinedtask.h"
+#include "tests/support/events.h"
 
-// What is reported, in order, as one line of words; progress is not in it. `hook` is called with each of
-// these, and with "progress", on the thread that reports.
-class BatchNotes : public QvBatchProcessCb {
+// What is reported, except for progress. `hook` is called with each of these, and with "progress", on the
+// thread that reports.
+class BatchNotes : public QvBatchProcessCb, public Events {
   public:
-    std::string all() const {
-        const std::lock_guard guard(lock_);
-        return all_;
-    }
-    std::string take() {
-        const std::lock_guard guard(lock_);
-        return std::exchange(all_, "");
-    }
-    void waitFor(const std::string& text) {
-        std::unique_lock guard(lock_);
-        changed_.wait(guard, [&] { return all_.find(text) != std::string::npos; });
-    }
     int count(const std::string& text) const {
         const std::string notes = all();
         int found = 0;
@@ -76,18 +62,10 @@ class BatchNotes : public QvBatchProcessCb {
         return std::to_string(task) + "." + std::to_string(segment);
     }
     int note(const std::string& text) {
-        {
-            const std::lock_guard guard(lock_);
-            all_ += (all_.empty() ? "" : " ") + text;
-            changed_.notify_all();
-        }
+        add(text);
         if (hook) hook(text);
         return 0;
     }
-
-    mutable std::mutex lock_;
-    std::condition_variable changed_;
-    std::string all_;
 };
 
 class BatchTest : public JoinedTask {
