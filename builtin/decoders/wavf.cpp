@@ -291,7 +291,7 @@ bool isPlausible(const Id& id) {
     return std::all_of(id.begin(), id.end(), [](char c) { return c >= ' ' && c <= '~'; });
 }
 
-// What describes the file itself, or fills it up.
+// Chunks that describe this very file, or only fill space: they are not copied to others.
 bool isOfTheFile(const Id& id) {
     constexpr const char* own[] = {"fmt ", "fact", "data", "ds64", "PEAK", "JUNK",
                                    "junk", "FLLR", "PAD ", "fill", "levl"};
@@ -304,7 +304,7 @@ class ChunkCollector : private ChunkReader {
                    std::vector<std::string>& others)
         : ChunkReader(file, header.bigEndian), kept_(kept), others_(others) {}
 
-    // Those from `position` up to `end`, or to what is no chunk.
+    // Collects chunks from `position` up to `end`, or up to something that is no chunk.
     void collect(long long position, long long end) {
         for (Chunk chunk; left_ > 0 && position + 8 <= end && chunkAt(position, chunk); --left_) {
             if (!isPlausible(chunk.id) || chunk.id == "data" || position + 8 + chunk.size > end) return;

@@ -67,7 +67,7 @@ class FileEncoder : public QvEncoder {
     Any extension_;
 };
 
-// One file on its way.
+// Passes one file to its stream of the multiplexer, unit by unit.
 class FileFeed {
   public:
     FileFeed(const QvFileMuxStream& stream, const QvModule* module)
@@ -78,7 +78,7 @@ class FileFeed {
         if (to_) to_->setAtachee(nullptr);
     }
 
-    // Texts say why it failed; "" if it did not.
+    // Each returns why it failed, or "".
     std::string begin(QvMuxer& muxer);
     std::string writeUnit();
     std::string end();
@@ -99,7 +99,7 @@ class FileFeed {
     long long written_ = 0;
     std::size_t unit_ = 0;       // number of the next one
     long long unitBytes_ = 0;    // of all units; 0: as stream_.units says
-    long long sampleBytes_ = 1;  // what no piece of sound is cut within
+    long long sampleBytes_ = 1;  // pieces of sound are multiples of this
     bool announced_ = false;     // units are announced
 
     std::string measure();
@@ -141,7 +141,7 @@ double FileFeed::seconds() const {
         const long long samples = written_ / sampleBytes_;
         return static_cast<double>(samples) / stream_.samplerate;
     }
-    // Nothing is known of its time.
+    // Without a time, by its part of the file: from 0 to 1.
     return static_cast<double>(written_) / static_cast<double>(length_);
 }
 
@@ -163,7 +163,7 @@ std::string FileFeed::writeUnit() {
     return "";
 }
 
-// A stream that keeps units together takes no more of sound than a block of its own.
+// Sound is cut into blocks that the stream can take.
 std::string FileFeed::put(long long bytes) {
     RawOutput output(*to_);
     long long piece = bytes;
@@ -187,7 +187,7 @@ std::string FileFeed::put(long long bytes) {
     return output.sound() ? "" : output.fault();
 }
 
-// Sound gets the sizes of its header by this.
+// By this the multiplexer completes the sizes in the header of sound.
 std::string FileFeed::end() {
     if (stream_.type != qvAudioStream) return "";
     auto* out = to_->input();

@@ -39,7 +39,7 @@ int parseColour(const std::string& text, const std::string& option) {
     return rgb;
 }
 
-// Of the names that a parameter offers; a number stands for itself.
+// The identifier of an encoding that is given by its name or its number.
 int parseEncoding(const std::string& text, const QvCodec& filter, const std::string& option) {
     const auto lower = [](std::string name) {
         std::transform(name.begin(), name.end(), name.begin(),
@@ -154,7 +154,7 @@ namespace {
 
 bool isFamily(const std::string& name) { return qv_registry()->hasFontFamily(name.c_str()); }
 
-// What has a folder or an ending was meant to be a file.
+// A name with a folder or an extension is that of a file, any other that of a font family.
 void checkFont(const std::string& name, const std::string& what) {
     if (exists(name) || name.find_first_of("/.") != std::string::npos) {
         requireInput(name);
@@ -172,7 +172,7 @@ void setFont(QvCodec& filter, const std::string& name, const std::string& what) 
     setChecked(filter, exists(name) ? "font_filename" : "font_family", name.c_str(), what);
 }
 
-// Where text stands, in the order of the keys of numbers.
+// Where text can be placed, in the order of a numeric keypad, from 1.
 const std::vector<std::string> kPlaces = {"bottom-left", "bottom",   "bottom-right", "left",     "middle",
                                           "right",       "top-left", "top",          "top-right"};
 
@@ -184,7 +184,7 @@ int parseAlign(const std::string& text, const std::string& what) {
     throw failure(Msg::noSuchAlign, {what, text, all});
 }
 
-// Of a picture's width or height.
+// Pixels; `text` may be a percentage of the picture's width or height, which is `length`.
 int parseMargin(const std::string& text, int length, const std::string& what) {
     double value = 0;
     const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), value);
@@ -283,7 +283,7 @@ std::string fileFault(const QvCodec& filter, const std::string& file, bool accep
     return "";
 }
 
-// Letters that stand out from any picture; a size of 0 is their usual one.
+// Letters get a shadow, so that they can be read on any picture. A size of 0 is the default.
 void setTextSize(QvCodec& filter, int size, const PictureFormat& picture, const std::string& what) {
     const Any before = filter.getParam("renderingOptions");
     AnyDict rendering = before.isDict() ? before.asDict() : AnyDict();

@@ -125,7 +125,7 @@ void Watcher::takeNotices() {
     std::set<std::string> names;
     const bool all = notices_.take(names);
     if (notices_.folderGone() || !all) nextScan_ = 0;
-    // With `once` what was there at the start is looked at, and no more.
+    // With `once` only files that were there at the start are looked at.
     for (const std::string& name : names)
         if (!options_.once || arrivals_.facts(name)) lookAt(name);
 }
@@ -161,7 +161,7 @@ void Watcher::lookAt(const std::string& name) {
     arrivals_.see(name, facts, Wake::now());
 }
 
-// Without reading it.
+// Decided without reading the file.
 bool Watcher::isNothingToDo(const std::string& name, const FileFacts& facts) {
     const WatchedFile* const known = memory_.find(name);
     if (!known || !known->isCertainly(facts)) return false;
@@ -188,14 +188,15 @@ void Watcher::handle(const std::string& name) {
     try {
         ended = make(name, facts);
     } catch (const Failure& failed) {
-        // The memory, or the place that inputs go to, can't be written, or the input can't be read.
+        // The record of files or the folder for processed inputs can't be written, or the input can't be
+        // read.
         ended = stopped() ? Ended::stopped : waitFor(name, failed.what());
     }
     if (ended == Ended::settled) {
         arrivals_.forget(name);
         delays_.erase(name);
         told_.erase(name);
-        // Here again already, or still: an input that stays is known now.
+        // A new file may already have the name. An input that was kept is known by now.
         if (!options_.once) lookAt(name);
     }
     if (ended == Ended::changed) {
@@ -206,7 +207,7 @@ void Watcher::handle(const std::string& name) {
     }
 }
 
-// One line for each reason, and further attempts at growing distances.
+// Reports each new reason once, and tries again after longer and longer times.
 Watcher::Ended Watcher::waitFor(const std::string& name, const std::string& why) {
     std::string& last = told_[name];
     if (last != why) {
@@ -244,7 +245,7 @@ Watcher::Ended Watcher::make(const std::string& name, const FileFacts& facts) {
     const bool touched = !file.isCertainly(facts);
     file.facts = facts;
     if (file.state == State::closed && options_.after != WatchOptions::After::keep) {
-        // It was put away, and has come once more: what was taken elsewhere meanwhile is made again.
+        // The input was moved away and is back: outputs that are missing by now are made again.
         file.state = State::begun;
         std::erase_if(file.made, [](const auto& made) {
             return !std::all_of(made.second.begin(), made.second.end(),

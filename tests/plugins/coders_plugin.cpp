@@ -3,9 +3,9 @@
 // The multiplexers put the lines of all streams into one file, below a line of their own.
 #include <memory>
 #include <string>
+#include <utility>
 
 #include "core/encode/basemuxer.h"
-#include "core/encode/qvencoder.h"
 #include "core/engine/modules/qvmodule.h"
 #include "core/engine/modules/qvplugin.h"
 #include "core/measure/bitrate.h"
@@ -15,6 +15,7 @@
 #include "core/media/qvpcm.h"
 #include "core/stream/file/qvfilebufstream.h"
 #include "core/stream/qvbufstrm.h"
+#include "tests/plugins/textcoder.h"
 
 namespace {
 
@@ -24,13 +25,11 @@ struct Coder {
     AnyDict settings, ranges;
 };
 
-// What both kinds of encoder share: settings that are a dictionary, and lines.
+// What both kinds of encoder share: settings of rate control, and a line that states them.
 template <class Base>
-class LineCoder : public Base {
+class LineCoder : public TextCoder<Base> {
   public:
-    using Base::getParam;
-
-    explicit LineCoder(const Coder& coder) : values_(coder.settings), ranges_(coder.ranges) {
+    explicit LineCoder(const Coder& coder) : TextCoder<Base>(coder.settings, coder.ranges) {
         ranges_.set("twoPassPossible", coder.twoPass ? 1 : 0);
         if (coder.twoPass) values_.set("twoPass", 0);
         values_.set("profile", 0);
@@ -43,43 +42,18 @@ class LineCoder : public Base {
         }
         if (key == "crf" && values_.isSet("crf") && (value.asInt32(-1) < 0 || value.asInt32(-1) > 51))
             return this->setError(QvStatus::invalidParam, "\"crf\" takes 0 to 51");
-        if (!values_.isSet(name)) return Base::setParam(name, value);
-        values_.set(name, value);
-        return QvStatus::ok;
-    }
-    void getParam(const char* name, Any& value) const override {
-        if (values_.isSet(name))
-            value = values_.get(name);
-        else if (ranges_.isSet(name))
-            value = ranges_.get(name);
-        else
-            Base::getParam(name, value);
-    }
-    void store(AnyDict& state) const override {
-        state = values_;
-        state.set("name", this->name());
-    }
-    int restore(const AnyDict& state) override {
-        for (const auto [key, value] : state)
-            if (values_.isSet(key)) values_.set(key, *value);
-        return QvStatus::ok;
+        return TextCoder<Base>::setParam(name, value);
     }
     int open() override {
         return write(std::string(this->name()) + " crf " + text("crf") + " rate " + text("vBitrate") +
                      text("bitrate") + " tune " + text("tune") + (statistics_ ? " with statistics" : "") +
                      "\n");
     }
-    int close() override { return QvStatus::ok; }
 
   protected:
-    int write(std::string line) {
-        if (first_) return QvStatus::ok;
-        auto* const out = this->outStream()->input();
-        const auto size = static_cast<unsigned>(line.size());
-        return out->copybytes(out, reinterpret_cast<unsigned char*>(line.data()), size) == size
-                   ? QvStatus::ok
-                   : this->setError(QvStatus::failed, "The output takes no more");
-    }
+    using TextCoder<Base>::values_, TextCoder<Base>::ranges_;
+
+    int write(std::string line) { return first_ ? QvStatus::ok : TextCoder<Base>::write(std::move(line)); }
 
   private:
     std::string text(const char* name) const {
@@ -89,7 +63,6 @@ class LineCoder : public Base {
         return value.isText() ? value.asString() : value.isInt() ? std::to_string(value.toInt64()) : "";
     }
 
-    AnyDict values_, ranges_;
     bool first_ = false, statistics_ = false;
 };
 

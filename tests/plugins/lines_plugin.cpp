@@ -7,7 +7,6 @@
 #include <utility>
 
 #include "core/encode/basemuxer.h"
-#include "core/encode/qvencoder.h"
 #include "core/engine/modules/qvmodule.h"
 #include "core/engine/modules/qvplugin.h"
 #include "core/measure/fourcc.h"
@@ -15,57 +14,25 @@
 #include "core/media/qvbuffer.h"
 #include "core/stream/file/qvfilebufstream.h"
 #include "core/stream/qvbufstrm.h"
+#include "tests/plugins/textcoder.h"
 
 namespace {
 
-class LineEncoder : public QvVideoEncoder {
+class LineEncoder : public TextCoder<QvVideoEncoder> {
   public:
-    using QvVideoEncoder::getParam;
-
-    LineEncoder() {
-        values_ = AnyDict("width", 320, "height", 240, "framerate", QvFramerate::f25p(), "profile", 0,
-                          "FOURCC", static_cast<int>(QvFourcc::I420));
-        ranges_ = AnyDict("sizeRange", AnyDict("wmin", 16, "wmax", 720, "hmin", 16, "hmax", 576),
-                          "framerateRange", AnyVector(Any(QvFramerate::f25p()), Any(QvFramerate::f50p())));
+    LineEncoder()
+        : TextCoder(
+              AnyDict("width", 320, "height", 240, "framerate", QvFramerate::f25p(), "profile", 0, "FOURCC",
+                      static_cast<int>(QvFourcc::I420)),
+              AnyDict("sizeRange", AnyDict("wmin", 16, "wmax", 720, "hmin", 16, "hmax", 576),
+                      "framerateRange", AnyVector(Any(QvFramerate::f25p()), Any(QvFramerate::f50p())))) {
         ranges_.set("inFOURCC", AnyVector(Any(static_cast<int>(QvFourcc::I420))));
         ranges_.set("extension", "h264");
     }
-    int setParam(const char* name, const Any& value) override {
-        if (!values_.isSet(name)) return QvVideoEncoder::setParam(name, value);
-        values_.set(name, value);
-        return QvStatus::ok;
-    }
-    void getParam(const char* name, Any& value) const override {
-        if (values_.isSet(name))
-            value = values_.get(name);
-        else if (ranges_.isSet(name))
-            value = ranges_.get(name);
-        else
-            QvVideoEncoder::getParam(name, value);
-    }
-    void store(AnyDict& state) const override {
-        state = values_;
-        state.set("name", name());
-    }
-    int restore(const AnyDict& state) override {
-        for (const auto [key, value] : state)
-            if (values_.isSet(key)) values_.set(key, *value);
-        return QvStatus::ok;
-    }
-    int open() override { return QvStatus::ok; }
-    int close() override { return QvStatus::ok; }
     int writeFrame(QvFrame* frame) override {
-        std::string line = std::to_string(frame->width()) + "x" + std::to_string(frame->height()) + "\n";
-        auto* const out = outStream()->input();
-        const auto size = static_cast<unsigned>(line.size());
-        return out->copybytes(out, reinterpret_cast<unsigned char*>(line.data()), size) == size
-                   ? QvStatus::ok
-                   : setError(QvStatus::failed, "The output takes no more");
+        return write(std::to_string(frame->width()) + "x" + std::to_string(frame->height()) + "\n");
     }
     QvFrame* lastFrame() override { return nullptr; }
-
-  private:
-    AnyDict values_, ranges_;
 };
 
 struct Module : QvModule {

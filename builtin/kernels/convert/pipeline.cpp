@@ -86,7 +86,7 @@ class Band {
         bool aligned;     // words may be written
     };
 
-    // The lines of one output after the other, which memory likes best.
+    // All lines of one output in a row: memory is fastest when it is accessed in order.
     void runAlone(const Output& output) {
         const Stage& stage = list_.at(output.stage);
         const int first = (first_ + output.down - 1) / output.down,
@@ -323,7 +323,8 @@ class Band {
         }
     }
 
-    // The line of the source that has the whole weight; null if none has.
+    // The source line whose tap has all of the weight, so that it can be copied; null if there is no such
+    // tap.
     const Byte* tapTakenWhole(const Stage& stage, int y) {
         const Axis& axis = stage.down->axis;
         const int start = axis.copies ? y + axis.offset : axis.start[count(y)];

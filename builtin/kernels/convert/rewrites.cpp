@@ -15,8 +15,8 @@ size_t count(int n) { return static_cast<size_t>(n); }
 
 int sizeOf(const StageList& list) { return static_cast<int>(list.stages.size()); }
 
-// Calls each(index) for the stages of a kind that are in the list now, without those it adds. Whether any
-// call returned true.
+// Calls each(index) for the stages of a kind that are in the list now, not for those that a call adds.
+// Returns whether any call returned true.
 template <class Each>
 bool forEach(StageList& list, Work work, const Each& each) {
     bool any = false;
@@ -100,7 +100,7 @@ bool copiesDropped(const Route&, StageList& list) {
 
 // --- The pass down first, while lines are short.
 
-// The work that is left for a plane after it was scaled down first; none: it has to be scaled across first.
+// The work that remains for a plane that is scaled down first; none: it has to be scaled across first.
 std::optional<Work> lastAfterDown(const AcrossPass& pass) {
     const int from = pass.axis.source, to = pass.axis.target;
     if (pass.axis.copies) return Work::downSamples;
@@ -111,8 +111,8 @@ std::optional<Work> lastAfterDown(const AcrossPass& pass) {
     return std::nullopt;
 }
 
-// If a plane is not scaled across, or exactly by two, both passes can work on samples, if the weights fit.
-// The pass across then rounds a second time where it takes means.
+// A plane that is not scaled across, or by exactly two, can be scaled down first, on samples, if the weights
+// fit. A pass across that takes means then rounds a second time.
 bool downFirst(const Route& route, StageList& list) {
     return forEach(list, Work::down, [&](int i) {
         const Stage down = list.at(i);
@@ -162,8 +162,8 @@ std::vector<Byte> pixelWeights(const Axis& down) {
     return weights;
 }
 
-// The last stage that scales plane `plane` of stage `change` to half its width and is its only reader; -1:
-// there is none.
+// The stage that completes a plane of stage `change` at half its width, if nothing else reads that plane;
+// otherwise -1. `filtered` is false if every second sample is dropped.
 int chromaOfHalves(StageList& list, int change, int plane, bool& filtered) {
     for (int i = 0; i < sizeOf(list); ++i) {
         const Stage& last = list.at(i);
@@ -258,7 +258,8 @@ std::vector<Byte> packedWeights(const Axis& down) {
     return weights;
 }
 
-// The stage that scales a plane of an unpacked picture down, and reads nothing else; -1: there is none.
+// The stage that scales a plane of an unpacked picture down and keeps its width, if nothing else reads that
+// plane; otherwise -1.
 int onlyScaledDown(StageList& list, int unpack, int plane) {
     Stage* reader = nullptr;
     const Feed* feed = list.onlyReader(unpack, plane, &reader);
@@ -267,7 +268,7 @@ int onlyScaledDown(StageList& list, int unpack, int plane) {
     return fits ? static_cast<int>(reader - list.stages.data()) : -1;
 }
 
-// Chroma is taken out of the pixels where it is scaled down, not line by line.
+// The stage that scales chroma down reads it from the packed pixels itself.
 bool chromaFromPacked(const Route& route, StageList& list) {
     if (route.deep) return false;
     return forEach(list, Work::unpack, [&](int i) {

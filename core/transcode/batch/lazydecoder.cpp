@@ -33,9 +33,9 @@ struct LazyDecoder::Source {
     std::shared_ptr<const SourceFacts> facts;
     Opener opener;
     std::unique_ptr<QvDecodePipe> decoder;  // while it is open
-    OpenDecoders::Order::iterator own;      // with a decoder that is not for good
+    OpenDecoders::Order::iterator own;      // end() while it is closed or `forGood`
     bool forGood = false;
-    bool spoiled = false;  // it has failed, so nobody else takes it over
+    bool spoiled = false;  // it has failed, so no other segment takes it over
     std::vector<Place> video, audio, subpic;
 
     std::vector<Place>& of(int type) {

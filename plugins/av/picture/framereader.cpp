@@ -19,10 +19,11 @@ namespace av {
 namespace {
 
 constexpr std::size_t notShown = static_cast<std::size_t>(-1);
-// A jump of the clock that is longer than this is no picture that stays, in streams that are cut together.
+// The longest time for which a picture can stay. A longer step is a jump of the clock, as where recordings
+// were joined.
 constexpr int longestStepOfBroadcast = 10;  // seconds
 constexpr int longestStepOfFile = 30 * 60 * 60;
-constexpr int mostStarts = 8;  // that may give nothing on the way to one picture
+constexpr int mostStarts = 8;  // failed starts for one picture; then only the first packet is tried
 
 // Whether pictures that are not referred to are presented as soon as they are decoded, so that the order of
 // presentation follows from the times of decoding.
@@ -35,20 +36,22 @@ Rational rational(AVRational r) { return {r.num, r.den}; }
 
 }  // namespace
 
-// Presentation numbers count the pictures that are shown; packets those of the index.
+// A presentation number counts pictures in the order in which they are shown, a packet number those of the
+// index.
 class FrameReader::Decoding {
   public:
     explicit Decoding(std::unique_ptr<DecodedPictures> source)
         : source_(std::move(source)), held_(av_frame_alloc()), coming_(av_frame_alloc()) {}
 
     bool begin(std::string& reason);
-    // The picture of that presentation number is in picture() then, or the last one before it that came.
+    // On success picture() is the one of that presentation number, or the last one before it if it can't be
+    // decoded.
     Read show(std::size_t wanted, std::string& failure);
     const AVFrame& picture() const { return *held_; }
     const AVFrame& first() const { return *coming_; }  // after begin()
     // In units of the time base.
     std::int64_t firstTime() const { return hasTimes() ? pictures_.front().time : 0; }
-    // Whether the reader's frame has the picture already, which is shown again.
+    // Whether the reader's frame already has the picture, as when it is shown again.
     bool isWritten() const { return written_ == heldNumber_; }
     bool shows(std::size_t number) const { return heldNumber_ == number; }
     void setWritten() { written_ = heldNumber_; }
@@ -67,8 +70,8 @@ class FrameReader::Decoding {
     std::unique_ptr<DecodedPictures> source_;
     std::vector<TimedPicture> pictures_;
     std::vector<std::size_t> number_;  // of a packet: its presentation number, or notShown
-    std::vector<bool> noStart_;        // of a packet: decoding can't start there, whatever its flag says
-    std::vector<bool> counted_;        // of a presentation number: it is among the concealed
+    std::vector<bool> noStart_;  // of a packet: decoding can't start there, even if it is flagged as key
+    std::vector<bool> counted_;  // of a presentation number: concealed_ includes it
     PicturePlan plan_;
     FramePtr held_, coming_;
     std::optional<std::size_t> heldNumber_, comingNumber_, written_;
@@ -103,7 +106,7 @@ bool FrameReader::Decoding::hasTimes() const {
     return without == 0 || (!bare && refersToNeighbours(source_->codec().codec_id));
 }
 
-// Without times only the codec knows the order of presentation: it decodes the stream once.
+// Without times only the codec knows the order of presentation, so the whole stream is decoded once.
 bool FrameReader::Decoding::decodeOrder(std::string& reason) {
     pictures_.clear();
     while (true) {
@@ -124,8 +127,8 @@ bool FrameReader::Decoding::isSecondField(std::size_t packet) const {
     return packets[packet].pts == packets[packet - 1].pts + packets[packet - 1].duration;
 }
 
-// In transport streams the two fields of a picture are packets of their own, the second without a place. The
-// first pictures show whether it is so here.
+// In transport streams each field of a picture can be a packet of its own, the second without a position in
+// the file. The first decoded pictures show whether that is so here.
 bool FrameReader::Decoding::dropSecondFields() {
     constexpr int enough = 8;
     const AVFieldOrder order = source_->stream().codecpar->field_order;
@@ -146,7 +149,7 @@ void FrameReader::Decoding::numberPackets() {
     for (std::size_t i = 0; i < pictures_.size(); ++i) number_[pictures_[i].packet] = i;
 }
 
-// Pictures before the first one that comes can't be decoded: they need pictures that are not in the file.
+// Drops the pictures before the first decoded one: they need pictures that are not in the file.
 bool FrameReader::Decoding::findFirst(std::string& reason) {
     while (!comingNumber_ && !ended_) {
         if (pull(reason) == Read::failed) return false;
@@ -211,7 +214,7 @@ void FrameReader::Decoding::conceal(std::size_t number) {
     ++concealed_;
 }
 
-// The next picture that is presented into coming_.
+// Decodes the next picture that is shown into coming_.
 FrameReader::Read FrameReader::Decoding::pull(std::string& failure) {
     comingNumber_.reset();
     while (!ended_) {
@@ -233,9 +236,9 @@ FrameReader::Read FrameReader::Decoding::pull(std::string& failure) {
     return Read::end;
 }
 
-// The last packet at or before the picture's own from which it can be decoded as from the start: a key
-// picture that is presented before it. Pictures after a key picture that are presented before it refer to
-// what precedes it.
+// The last packet from which the picture can be decoded as it would be from the start of the stream: a key
+// picture that is not shown after it. A picture that follows a key picture in the stream, but is shown before
+// it, needs what precedes the key picture.
 std::size_t FrameReader::Decoding::startFor(std::size_t wanted) const {
     const auto& packets = source_->packets();
     for (std::size_t i = pictures_[wanted].packet; i > 0; --i)
@@ -243,7 +246,7 @@ std::size_t FrameReader::Decoding::startFor(std::size_t wanted) const {
     return 0;
 }
 
-// Makes the pictures that come next reach the wanted one: goes on from here, or starts at a key picture.
+// Prepares to decode up to the wanted picture: continues from here, or seeks to a key picture.
 bool FrameReader::Decoding::reach(std::size_t wanted, std::string& failure) {
     const std::size_t start = startFor(wanted);
     const bool ahead = (heldNumber_ && *heldNumber_ <= wanted) || (comingNumber_ && *comingNumber_ <= wanted);
@@ -258,14 +261,14 @@ bool FrameReader::Decoding::reach(std::size_t wanted, std::string& failure) {
     return false;
 }
 
-// The picture can't be reached from startedAt_. Each start that gives nothing may cost a decoding to the end
-// of the film, so after some of them the only one left before the picture is the first packet.
+// Excludes startedAt_ as a start. A start that fails may cost a decoding to the end of the film, so after
+// mostStarts of them only the first packet is left.
 void FrameReader::Decoding::dropStart(int& dropped) {
     noStart_[startedAt_] = true;
     if (++dropped == mostStarts) std::fill_n(noStart_.begin(), static_cast<std::ptrdiff_t>(startedAt_), true);
 }
 
-// Decodes up to the wanted picture; the end if it does not come.
+// Decodes up to the wanted picture. Read::end: the decoder skipped it.
 FrameReader::Read FrameReader::Decoding::advance(std::size_t wanted, int& dropped, std::string& failure) {
     if (!reach(wanted, failure)) return Read::failed;
     for (;;) {
@@ -294,7 +297,7 @@ FrameReader::Read FrameReader::Decoding::show(std::size_t wanted, std::string& f
         conceal(wanted);
         if (heldNumber_) return Read::picture;
         if (startedAt_ == 0) break;
-        // Nothing before it came from that start: what the film shows then is further ahead of it.
+        // That start gave no earlier picture either: the one to show instead lies before the start.
         dropStart(dropped);
     }
     failure = "its pictures can't be decoded";
@@ -367,7 +370,7 @@ bool FrameReader::describe(bool upright) {
     return true;
 }
 
-// The frames are as the film is to be shown from here on, if their layout allows it.
+// From here on frames are turned as the film is to be shown, if their layout allows it.
 void FrameReader::turnUpright() {
     auto turner = std::make_unique<PictureTurner>(format_.turn);
     const AVFrame* const first = turner->turn(decoding_->first());
@@ -406,7 +409,7 @@ FrameReader::Read FrameReader::read() {
     }
     frame_->setYUVMatrix(static_cast<QvYUVMatrix>(format_.colourMatrix));
     frame_->frameNr = next_++;
-    // A picture that stays says its captions once.
+    // A picture that is shown for several frames carries its captions in the first of them only.
     if (decoding_->shows(wanted) && (shown.empty() || n == 0 || shown[n - 1] != shown[n]))
         carryCaptions(picture, MediaTime(frame_->frameNr, format_.rate, MediaTime::defaultTimescale),
                       *frame_);

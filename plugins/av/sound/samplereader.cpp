@@ -15,7 +15,7 @@ namespace av {
 
 namespace {
 
-// What a codec carries from packet to packet, and so how far ahead of a packet decoding has to start.
+// What a codec carries from packet to packet: it decides how many packets earlier decoding has to start.
 enum class Memory {
     none,   // a key packet is enough
     fades,  // overlaps, filters, the bit reservoir of MP3 (511 bytes back), the levels of Opus
@@ -45,7 +45,7 @@ Memory memoryOf(AVCodecID codec) {
 
 constexpr std::size_t nothing = static_cast<std::size_t>(-1);
 
-// How many packets are decoded at the start to see that the codec gives what the packets say.
+// Packets that are decoded at the start to check the numbers of samples that packets state.
 constexpr std::size_t probedPackets = 16;
 
 // Bytes of the frame of AMR that begins there; some containers put several into a packet, and the codec takes
@@ -56,14 +56,14 @@ int amrFrame(AVCodecID codec, int first) {
     return (codec == AV_CODEC_ID_AMR_WB ? wide : narrow)[first >> 3 & 15];
 }
 
-// Samples at the start that the header of Opus says are none of the sound.
+// Samples to drop at the start, as the header of Opus states them.
 std::uint32_t ownPriming(const AVCodecParameters& codec) {
     constexpr int at = 10;
     if (codec.codec_id != AV_CODEC_ID_OPUS || codec.extradata_size < at + 2) return 0;
     return codec.extradata[at] | static_cast<std::uint32_t>(codec.extradata[at + 1]) << 8;
 }
 
-// As people, and the engine's logic, know them.
+// The names that users see and that the engine compares.
 std::string nameOf(AVCodecID codec) {
     if (codec >= AV_CODEC_ID_FIRST_AUDIO && codec < AV_CODEC_ID_ADPCM_IMA_QT) return "PCM";
     switch (codec) {
@@ -84,7 +84,8 @@ std::string nameOf(AVCodecID codec) {
 
 }  // namespace
 
-// How many samples each packet has, the packets say where they can; else all of them are decoded once.
+// Packets state how many samples they have. If some do not, or are wrong, the stream is decoded once to
+// count.
 class SampleReader::Decoding {
   public:
     bool open(const MediaBytes& bytes, const std::string& format, int stream,
@@ -125,7 +126,7 @@ class SampleReader::Decoding {
 
     const std::vector<IndexedPacket>& packets() const { return index_->packets(stream_); }
     AVStream& stream() { return *input_->context().streams[stream_]; }
-    // Of MPEG audio the first frame of another rate still has the rate before.
+    // In MPEG audio the first frame after a change of the rate still states the old one.
     int rate() const { return codec_->sample_rate > 0 ? codec_->sample_rate : frame_->sample_rate; }
     bool isSame() const {
         return rate() == samplerate_ && frame_->ch_layout.nb_channels == channels_ && frame_->format == kind_;
@@ -158,7 +159,7 @@ bool SampleReader::Decoding::open(const MediaBytes& bytes, const std::string& fo
     return false;
 }
 
-// A new one for each start: flushing leaves some of the memory of what was decoded before.
+// Each start gets a new codec: a flushed one still remembers some of what it decoded before.
 bool SampleReader::Decoding::openCodec(std::string& reason) {
     const AVCodecParameters& parameters = *stream().codecpar;
     const AVCodec* const decoder = avcodec_find_decoder(parameters.codec_id);
@@ -199,7 +200,7 @@ bool SampleReader::Decoding::seek(std::size_t packet) {
     return found;
 }
 
-// The packet, or the first frame of what is left of it, into the codec.
+// Sends the packet to the codec; of several frames in it, the first that is left.
 int SampleReader::Decoding::send() {
     AVPacket& packet = *packet_;
     const AVCodecID codec = codec_->codec_id;
@@ -221,7 +222,7 @@ int SampleReader::Decoding::send() {
     return result;
 }
 
-// The next frame of the codec, into frame_.
+// Decodes the next frame into frame_.
 SampleReader::Decoding::Next SampleReader::Decoding::decode() {
     for (;;) {
         const int result = avcodec_receive_frame(codec_.get(), frame_.get());
@@ -250,7 +251,7 @@ SampleReader::Decoding::Next SampleReader::Decoding::decode() {
     }
 }
 
-// The first frame says what the sound is; a change of that later is the end of the stream.
+// The first frame determines rate, channels and format of the sound. The stream ends where they change.
 void SampleReader::Decoding::take(const AVFrame& frame) {
     if (samplerate_ != 0) return;
     samplerate_ = rate();
@@ -258,7 +259,7 @@ void SampleReader::Decoding::take(const AVFrame& frame) {
     kind_ = static_cast<AVSampleFormat>(frame.format);
 }
 
-// Whether all packets say how many samples they have, and the codec makes as many of the first of them.
+// Whether all packets state how many samples they have, and the first ones really have as many.
 bool SampleReader::Decoding::decodesAsTold() {
     const auto& all = packets();
     if (std::any_of(all.begin(), all.end(),
@@ -275,7 +276,7 @@ bool SampleReader::Decoding::decodesAsTold() {
             knownPriming_ = AV_RL32(skip->data);
         decoded[packet] += static_cast<std::uint64_t>(frame_->nb_samples);
     }
-    // AAC states half of its rate where bands of high frequencies are added to it.
+    // AAC with spectral band replication may state half of its rate.
     const bool doubles =
         stream().codecpar->codec_id == AV_CODEC_ID_AAC || stream().codecpar->codec_id == AV_CODEC_ID_AAC_LATM;
     const std::uint64_t told = all[0].samples;
@@ -347,7 +348,7 @@ bool SampleReader::Decoding::place(bool hasZero, std::int64_t zero, std::int64_t
     return format.samples > 0;
 }
 
-// The packet from which decoding starts, so that this one comes out as from the start.
+// Where decoding has to start so that this packet gives the same samples as from the start of the stream.
 std::size_t SampleReader::Decoding::startFor(std::size_t packet) const {
     const auto& all = packets();
     const AVCodecID codec = codec_->codec_id;
@@ -423,7 +424,7 @@ bool SampleReader::seek(long long sample) {
     return true;
 }
 
-// A block into block_, or none at the end.
+// Reads the next block into block_, which is empty at the end.
 bool SampleReader::fetch() {
     if (std::exchange(moved_, false)) {
         block_.clear();

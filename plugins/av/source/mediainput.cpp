@@ -16,15 +16,15 @@ namespace {
 
 constexpr int bufferBytes = 64 * 1024;
 
-// By the names that the library has for them. What opens other files by names in the file (playlists,
-// concatenations) is not here.
+// The library's names of the containers. Those that open further files by names in the file (playlists,
+// concatenations) are left out.
 constexpr const char* containers =
     "mov,mp4,matroska,webm,avi,mxf,mpegts,mpeg,mpegvideo,dv,gxf,ogg,flv,yuv4mpegpipe,asf,nut,ivf,wtv,"
     "h264,hevc,m4v,mjpeg,obu,vc1,"
     "mp3,aac,flac,ac3,eac3,aiff,caf,w64,wav,au,amr,wv,tta,dts,truehd,ape,"
     "png_pipe,jpeg_pipe,tiff_pipe,dpx_pipe,exr_pipe";
 
-// What one reader of a shared source sees: a position of its own.
+// One reader of a shared source, with a position of its own.
 class SharedReader : public QvByteSource {
   public:
     explicit SharedReader(QvByteSource& source) : source_(source) {}
@@ -73,7 +73,7 @@ std::string reasonOf(int code) {
 // What the library reads from.
 struct Bytes {
     std::unique_ptr<QvByteSource> source;
-    long long left = -1;  // the place of reading while bytes are left out; -1: they are read
+    long long left = -1;  // the position while packets are read without their bytes; -1: bytes are read
 };
 
 int readBytes(void* opaque, std::uint8_t* to, int count) {
@@ -127,8 +127,8 @@ bool after(const PacketKey& key, const AVPacket& packet) {
     return key.position >= 0 && packet.pos > key.position;
 }
 
-// Streams of frames that follow each other without a container: the place of a packet says which one it is,
-// and its time depends on where reading began.
+// Frames that follow each other without a container. A packet is identified by its place in the file, as its
+// time depends on where reading began.
 bool isBare(const AVFormatContext& context) {
     return context.nb_streams == 1 && (context.iformat->flags & AVFMT_GENERIC_INDEX) &&
            !(context.iformat->flags & AVFMT_NO_BYTE_SEEK) && lower(context.iformat->name) != "ogg";
@@ -140,7 +140,7 @@ bool isEncrypted(const AVStream& stream) {
            av_stream_get_side_data(&stream, AV_PKT_DATA_ENCRYPTION_INIT_INFO, nullptr);
 }
 
-// Codecs for whose packets the library looks at no byte to say what they are.
+// Codecs whose packets the library can describe without their bytes.
 bool isKnownByTable(const AVCodecParameters& codec) {
     switch (codec.codec_id) {
         case AV_CODEC_ID_H264:
@@ -218,7 +218,7 @@ struct MediaInput::State {
     void takeBytes();
 };
 
-// What the library has buffered is none of the file's.
+// Continues with real bytes; those that the library has buffered are not from the file.
 void MediaInput::State::takeBytes() {
     if (bytes.left < 0) return;
     bytes.source->seek(bytes.left);
@@ -249,7 +249,7 @@ int MediaInput::State::open(const MediaBytes& from, const std::string& format) {
     const AVInputFormat* forced = nullptr;
     if (!format.empty() && !(forced = av_find_input_format(format.c_str()))) return AVERROR_DEMUXER_NOT_FOUND;
     const Any name = from.name().toString();
-    // By the name of a picture the library would look for others of such names.
+    // Given the name of a picture, the library would look for a numbered sequence.
     int result =
         avformat_open_input(&context, isPicture(name.asString("")) ? "" : name.asString(""), forced, nullptr);
     if (result >= 0) result = avformat_find_stream_info(context, nullptr);
@@ -299,7 +299,7 @@ MediaInput::Read MediaInput::read(AVPacket& packet) {
         av_packet_move_ref(&packet, state_->found.get());
         return Read::packet;
     }
-    // A number of failures may follow each other where the library looks for the next good place.
+    // Several failures may follow each other while the library looks for the next intact packet.
     for (int failures = 0;;) {
         const int result = av_read_frame(state_->context, &packet);
         if (result >= 0) {
@@ -360,7 +360,7 @@ bool MediaInput::rewind() {
     return false;
 }
 
-// Reads up to that packet. False if it is not among what follows.
+// Reads up to that packet. False if it does not follow.
 bool MediaInput::find(int stream, const PacketKey& key) {
     const bool bare = isBare(context());
     // Where pictures are cut out of a stream of bytes, the first one after a seek may be the end of another
@@ -387,7 +387,7 @@ bool MediaInput::find(int stream, const PacketKey& key) {
     return false;
 }
 
-// The same from the start, by counting.
+// Rewinds and reads up to the packet of that number.
 bool MediaInput::count(int stream, std::size_t number) {
     if (!rewind()) return false;
     AVPacket& packet = *state_->found;

@@ -21,10 +21,10 @@ namespace fs = std::filesystem;
 
 namespace {
 
-// Of the files in the hidden folder; whatever the final name holds, the engine handles this one. Where
-// several outputs write into a folder, the others have a number in front.
+// The stem that files have in the hidden folder. The engine sees only this name, whatever characters the
+// final one has. If several outputs share a folder, a number precedes it for all but the first.
 const std::string kBase = "out";
-// What can follow it.
+// The characters that can follow it.
 constexpr const char* kNameLetters = "#.0123456789abcdefghijklmnopqrstuvwxyz";
 
 fs::path folderOf(const fs::path& name) {
@@ -67,9 +67,9 @@ void checkFolder(const fs::path& name) {
     }
 }
 
-// Where the links lead to that `name` is, also if nothing is there yet.
+// The name to which a symbolic link leads in the end, which need not exist.
 fs::path followed(fs::path name) {
-    constexpr int most = 40;  // as the system follows
+    constexpr int most = 40;  // links, the limit of the system
     std::error_code error;
     for (int i = 0; i < most && fs::is_symlink(fs::symlink_status(name, error)); ++i) {
         const fs::path to = fs::read_symlink(name, error);

@@ -2,39 +2,33 @@
 #pragma once
 
 #include <atomic>
-#include <condition_variable>
 #include <functional>
-#include <mutex>
+#include <optional>
 #include <stdexcept>
 #include <string>
-#include <utility>
 #include <vector>
 
 #include "core/batch/qvbatchprocessor.h"
 #include "tests/core/transcode/batch/joinedtask.h"
+#include "tests/support/events.h"
 
-// What is reported, in order, as one line of words; progress is not in it. `hook` is called with each of
-// these, and with "progress", on the thread that reports.
-class BatchNotes : public QvBatchProcessCb {
+// What is reported, except for progress. `hook` is called with each of these, and with "progress", on the
+// thread that reports.
+class BatchNotes : public QvBatchProcessCb, public Events {
   public:
-    std::string all() const {
-        const std::lock_guard guard(lock_);
-        return all_;
-    }
-    std::string take() {
-        const std::lock_guard guard(lock_);
-        return std::exchange(all_, "");
-    }
-    void waitFor(const std::string& text) {
-        std::unique_lock guard(lock_);
-        changed_.wait(guard, [&] { return all_.find(text) != std::string::npos; });
-    }
     int count(const std::string& text) const {
         const std::string notes = all();
         int found = 0;
         for (std::size_t at = notes.find(text); at != std::string::npos; at = notes.find(text, at + 1))
             ++found;
         return found;
+    }
+
+    // Calls the action on each report of this text, in place of any former hook.
+    void when(const std::string& report, const std::function<void()>& action) {
+        hook = [=](const std::string& text) {
+            if (text == report) action();
+        };
     }
 
     std::function<void(const std::string&)> hook;
@@ -68,31 +62,25 @@ class BatchNotes : public QvBatchProcessCb {
         return std::to_string(task) + "." + std::to_string(segment);
     }
     int note(const std::string& text) {
-        {
-            const std::lock_guard guard(lock_);
-            all_ += (all_.empty() ? "" : " ") + text;
-            changed_.notify_all();
-        }
+        add(text);
         if (hook) hook(text);
         return 0;
     }
-
-    mutable std::mutex lock_;
-    std::condition_variable changed_;
-    std::string all_;
 };
 
 class BatchTest : public JoinedTask {
   protected:
-    // Sound alone, each file a segment of it.
-    QvTaskState task(const std::string& out, const std::vector<AnyDict>& files) const {
+    // Only sound, or only pictures; each file is a segment.
+    QvTaskState task(const std::string& out, const std::vector<AnyDict>& files, int type = qvAudioStream,
+                     const std::optional<InOutPoints>& points = {}) const {
         QvTaskState made;
         made.set("__class__", "TranscodeTask");
-        made.set("encoder", output(1, QvFramerate(0.0)));
+        made.set("encoder", type == qvAudioStream ? output(1, QvFramerate(0.0)) : output(0));
         made.setOutputFilename(folder_.file(out).c_str());
-        made.set("streams", AnyVector(AnyDict("type", 2)));
+        made.set("streams", AnyVector(AnyDict("type", type)));
         made.set("segments", AnyVector());
-        for (const AnyDict& file : files) made.addSegment(AnyVector(source(2, file)), AnyVector(file));
+        for (const AnyDict& file : files)
+            made.addSegment(AnyVector(source(type, file, points)), AnyVector(file));
         return made;
     }
     QvTaskState good(int number) const { return task("out" + std::to_string(number) + ".x", {wav_}); }

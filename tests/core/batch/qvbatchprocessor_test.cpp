@@ -254,17 +254,13 @@ TEST_F(QvBatchProcessorTest, StopEndsATaskAndTheRun) {
     list_.append(good(0));
     list_.append(good(1));
     const char* aborted = "begin task0 init0.0:0 seg0.0 segdone0.0:2 done0:2 end";
-    notes_.hook = [&](const std::string& text) {
-        if (text == "seg0.0") processor_.stop();
-    };
+    notes_.when("seg0.0", [&] { processor_.stop(); });
     runAll();
     EXPECT_EQ(notes_.take(), aborted) << "from a callback";
     EXPECT_EQ(processor_.start(true, &notes_), 0);
     EXPECT_EQ(notes_.take(), aborted) << "in a synchronous run";
 
-    notes_.hook = [&](const std::string& text) {
-        if (text == "seg0.0") processor_.pause();
-    };
+    notes_.when("seg0.0", [&] { processor_.pause(); });
     LogCapture log;
     ASSERT_EQ(processor_.start(false, &notes_), 0);
     notes_.waitFor("paused");
@@ -303,14 +299,8 @@ TEST_F(QvBatchProcessorTest, StopEndsTheWaitForAReader) {
 TEST_F(QvBatchProcessorTest, LongVideosReportEveryHundredFrames) {
     const auto reports = [this](int frames, double to) {
         const AnyDict file = film("film.yuv", frames, 0, QvFramerate::f25p(), width, height);
-        QvTaskState one;
-        one.set("encoder", output(0));
-        one.setOutputFilename(folder_.file("out0.x").c_str());
-        one.set("streams", AnyVector(AnyDict("type", 1)));
-        one.set("segments", AnyVector());
-        one.addSegment(AnyVector(source(1, file, cut(0, to))), AnyVector(file));
         QvBatchList list;
-        list.append(one);
+        list.append(task("out0.x", {file}, qvVideoStream, cut(0, to)));
         processor_.init(list);
         notes_.progressed.clear();
         EXPECT_EQ(processor_.start(true, &notes_), 0);
@@ -323,16 +313,10 @@ TEST_F(QvBatchProcessorTest, LongVideosReportEveryHundredFrames) {
 }
 
 TEST_F(QvBatchProcessorTest, TheLengthOfJoinedVideosCountsAsAWhole) {
-    QvTaskState joined;
-    joined.set("encoder", output(0));
-    joined.setOutputFilename(folder_.file("out0.x").c_str());
-    joined.set("streams", AnyVector(AnyDict("type", 1)));
-    joined.set("segments", AnyVector());
-    for (const char* name : {"a.yuv", "b.yuv"}) {
-        const AnyDict file = film(name, 600, 0, QvFramerate::f25p(), width, height);
-        joined.addSegment(AnyVector(source(1, file)), AnyVector(file));
-    }
-    list_.append(joined);
+    const auto part = [this](const char* name) {
+        return film(name, 600, 0, QvFramerate::f25p(), width, height);
+    };
+    list_.append(task("out0.x", {part("a.yuv"), part("b.yuv")}, qvVideoStream));
     processor_.init(list_);
     EXPECT_EQ(processor_.start(true, &notes_), 0);
     EXPECT_EQ(notes_.progressed.size(), 12u);
@@ -343,8 +327,10 @@ TEST_F(QvBatchProcessorTest, TheLengthOfJoinedVideosCountsAsAWhole) {
 TEST_F(QvBatchProcessorTest, APauseWithinATaskHoldsIt) {
     list_.append(good(0));
     processor_.init(list_);
+    bool afterwards = true;
     notes_.hook = [&](const std::string& text) {
         if (text == "seg0.0") processor_.pause();
+        if (text == "segdone0.0:0") afterwards = processor_.isPaused();
     };
     ASSERT_EQ(processor_.start(false, &notes_), 0);
     notes_.waitFor("paused");
@@ -352,6 +338,7 @@ TEST_F(QvBatchProcessorTest, APauseWithinATaskHoldsIt) {
     EXPECT_TRUE(processor_.isRunning());
     processor_.unpause();
     notes_.waitFor("end");
+    EXPECT_FALSE(afterwards);
     EXPECT_FALSE(processor_.isPaused());
     EXPECT_EQ(notes_.take(), "begin task0 init0.0:0 seg0.0 paused resumed segdone0.0:0 done0:0 end");
 }
@@ -359,9 +346,7 @@ TEST_F(QvBatchProcessorTest, APauseWithinATaskHoldsIt) {
 TEST_F(QvBatchProcessorTest, APauseBetweenTasksLeavesOutTheOneThatWasDue) {
     for (int i = 0; i < 3; ++i) list_.append(good(i));
     processor_.init(list_);
-    notes_.hook = [&](const std::string& text) {
-        if (text == "done0:0") processor_.pause();
-    };
+    notes_.when("done0:0", [&] { processor_.pause(); });
     ASSERT_EQ(processor_.start(false, &notes_), 0);
     notes_.waitFor("paused");
     EXPECT_FALSE(isWritten(1));
@@ -414,9 +399,7 @@ TEST_F(QvBatchProcessorTest, ACallbackThatThrowsEndsTheRun) {
         for (const char* where : {"begin", "skipped0", "task1", "init1.0:0", "seg1.0", "progress",
                                   "segdone1.0:0", "seg1.1", "segdone1.1:0", "done1:0", "end"}) {
             notes_.take();
-            notes_.hook = [&](const std::string& text) {
-                if (text == where) throw std::runtime_error("thrown in " + text);
-            };
+            notes_.when(where, [&] { throw std::runtime_error(std::string("thrown in ") + where); });
             const int result = processor_.start(synchronous, &notes_);
             EXPECT_EQ(result, synchronous ? -1 : 0) << where;
             notes_.waitFor("end");
@@ -429,9 +412,7 @@ TEST_F(QvBatchProcessorTest, ACallbackThatThrowsEndsTheRun) {
                          (std::string("A callback failed: thrown in ") + where).c_str());
             EXPECT_EQ(processor_.errorCode(), -1);
         }
-    notes_.hook = [](const std::string& text) {
-        if (text == "task1") throw 5;
-    };
+    notes_.when("task1", [] { throw 5; });
     EXPECT_EQ(processor_.start(true, &notes_), -1);
     EXPECT_EQ(processor_.errorDesc(), "A callback failed: unknown exception");
 }

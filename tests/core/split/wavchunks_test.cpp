@@ -141,6 +141,11 @@ TEST(WavChunks, SayWhatTheyHold) {
     EXPECT_STREQ(origin.getString("codingHistory", ""), "A=PCM,F=48000");
     EXPECT_EQ(origin.getInt64("timeReference", 0), 172800000);
     EXPECT_EQ(origin.getInt32("version", 0), 2);
+    const auto isDescribed = [](size_t bytes) {
+        return QvWavChunks::describe(list({{"bext", bext(0, measured).substr(0, bytes)}})).isSet("bext");
+    };
+    EXPECT_TRUE(isDescribed(602)) << "a chunk without coding history";
+    EXPECT_FALSE(isDescribed(601));
     const AnyVector& info = all.get("info").asVector();
     ASSERT_EQ(info.size(), 2);
     EXPECT_STREQ(info.at(1).asDict().getString("id", ""), "IART");

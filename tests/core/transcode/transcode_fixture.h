@@ -2,38 +2,15 @@
 #pragma once
 
 #include <atomic>
-#include <condition_variable>
 #include <cstdio>
 #include <functional>
-#include <mutex>
 #include <utility>
 
 #include "core/transcode/run/qvtranscoder.h"
 #include "core/transcode/task/qvtranscodetask.h"
 #include "tests/support/checks.h"
+#include "tests/support/events.h"
 #include "tests/support/fake_streams.h"
-
-class Events {
-  public:
-    void add(const std::string& text) {
-        const std::lock_guard guard(lock_);
-        all_ += (all_.empty() ? "" : " ") + text;
-        changed_.notify_all();
-    }
-    std::string take() {
-        const std::lock_guard guard(lock_);
-        return std::exchange(all_, "");
-    }
-    void waitFor(const std::string& text) {
-        std::unique_lock guard(lock_);
-        changed_.wait(guard, [&] { return all_.find(text) != std::string::npos; });
-    }
-
-  private:
-    std::mutex lock_;
-    std::condition_variable changed_;
-    std::string all_;
-};
 
 class NotedAudio : public FakeAudioEncoder {
   public:

@@ -4,21 +4,11 @@
 
 #include "tarsel/sound/channelmap.h"
 #include "tarsel/sound/soundeffects.h"
-#include "tarsel/words/failure.h"
+#include "tests/tarsel/refusal.h"
 
 namespace {
 
 using testing::HasSubstr;
-
-template <class Action>
-std::string refusal(Action action) {
-    try {
-        action();
-    } catch (const Failure& failure) {
-        return failure.what();
-    }
-    return "";
-}
 
 TEST(ChannelMap, IsReadAndRefused) {
     using Rows = std::vector<std::vector<ChannelMap::Input>>;

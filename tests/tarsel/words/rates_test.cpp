@@ -1,8 +1,9 @@
 // Frame rates as people type them and as the tool prints them.
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include "tarsel/words/failure.h"
 #include "tarsel/words/timespec.h"
+#include "tests/tarsel/refusal.h"
 
 namespace {
 
@@ -105,13 +106,9 @@ TEST(Rates, OfFieldsAreRefusedWithThoseOfFrames) {
         {"25 ", "25i"},
     };
     for (const auto& row : rows) {
-        try {
-            parseRate(row.typed, "--rate");
-            ADD_FAILURE() << row.typed;
-        } catch (const Failure& failure) {
-            EXPECT_EQ(failure.exit(), Exit::usage);
-            EXPECT_NE(std::string(failure.what()).find(row.hint), std::string::npos) << failure.what();
-        }
+        Exit exit = Exit::done;
+        EXPECT_THAT(refusal([&] { parseRate(row.typed, "--rate"); }, &exit), testing::HasSubstr(row.hint));
+        EXPECT_EQ(exit, Exit::usage) << row.typed;
     }
 }
 

@@ -37,11 +37,9 @@ class FrameReaderOfFilms : public Films {
         bytes_ = std::make_unique<av::MediaBytes>(Any(film.c_str()));
         std::string reason;
         const auto input = av::MediaInput::open(*bytes_, "", reason);
-        EXPECT_TRUE(input) << reason;
-        if (!input) return nullptr;
-        const std::shared_ptr<const av::PacketIndex> index = av::PacketIndex::build(*input, reason);
-        EXPECT_TRUE(index) << reason;
-        auto reader = index ? FrameReader::open(*bytes_, "", 0, index, {threads, upright}, reason) : nullptr;
+        index_ = input ? av::PacketIndex::build(*input, reason) : nullptr;
+        auto reader =
+            index_ ? FrameReader::open(*bytes_, "", 0, index_, {threads, upright}, reason) : nullptr;
         EXPECT_TRUE(reader) << reason;
         return reader;
     }
@@ -75,6 +73,7 @@ class FrameReaderOfFilms : public Films {
 
     EngineScope engine_;
     std::unique_ptr<av::MediaBytes> bytes_;
+    std::shared_ptr<const av::PacketIndex> index_;  // of the film that was opened last
 };
 
 TEST_F(FrameReaderOfFilms, everyPictureIsTheSameInOrderAndAfterSeeks) {
@@ -173,13 +172,8 @@ TEST_F(FrameReaderOfFilms, aHoleInTheFileIsCountedAndTheRestIsExact) {
     const auto whole = open(file);
     ASSERT_TRUE(whole);
     std::string bytes = TempFolder::read(file);
-    std::string reason;
-    const auto input = av::MediaInput::open(*bytes_, "", reason);
-    ASSERT_TRUE(input) << reason;
-    const auto index = av::PacketIndex::build(*input, reason);
-    ASSERT_TRUE(index) << reason;
     // Within the data of picture 20.
-    bytes.replace(static_cast<std::size_t>(index->packets(0)[20].position) + 300, 20, 20, '\x55');
+    bytes.replace(static_cast<std::size_t>(index_->packets(0)[20].position) + 300, 20, 20, '\x55');
     folder.write("damaged.mkv", bytes);
     const auto damaged = open(folder.file("damaged.mkv"));
     ASSERT_TRUE(damaged);
@@ -203,12 +197,7 @@ TEST_F(FrameReaderOfFilms, startsThatGiveNothingEndAtTheFirstPicture) {
     ASSERT_TRUE(whole->seek(1));
     ASSERT_EQ(whole->read(), FrameReader::Read::picture);
     std::string bytes = TempFolder::read(file);
-    std::string reason;
-    const auto input = av::MediaInput::open(*bytes_, "", reason);
-    ASSERT_TRUE(input) << reason;
-    const auto index = av::PacketIndex::build(*input, reason);
-    ASSERT_TRUE(index) << reason;
-    const auto& packets = index->packets(0);
+    const auto& packets = index_->packets(0);
     for (std::size_t i = 2; i < packets.size(); ++i) {
         // The length of the first unit stays, and nothing of what it holds.
         const auto at = static_cast<std::size_t>(packets[i].position) + 5;

@@ -6,8 +6,8 @@
 
 #include <functional>
 
-#include "tarsel/words/failure.h"
 #include "tarsel/words/timespec.h"
+#include "tests/tarsel/refusal.h"
 
 namespace {
 
@@ -52,17 +52,6 @@ PlanOptions to(const char* output) {
 
 JobPlan planned(const PlanOptions& options, std::vector<JobInput> inputs) {
     return planJob(options, outputForm(options, OutputPlace::files), std::move(inputs));
-}
-
-// The line with which an action fails; empty if it does not.
-template <class Action>
-std::string refusal(Action action) {
-    try {
-        action();
-    } catch (const Failure& failure) {
-        return failure.what();
-    }
-    return "";
 }
 
 TEST_F(Plan, PointsAndLengthsOfOneStream) {
