@@ -77,7 +77,7 @@ TEST_F(FileStream, WhatCanNotBeOpened) {
     for (const std::string& bad : {folder.file("none/a"), folder.path().string(), std::string(),
                                    folder.file(std::string(3000, 'n'))}) {
         EXPECT_EQ(stream.init(output(bad)), QvStatus::failed) << bad;
-        EXPECT_EQ(stream.init(source(bad + "/x")), QvStatus::failed) << bad;
+        EXPECT_EQ(stream.init(source(bad + "/none/x")), QvStatus::failed) << bad;
         EXPECT_FALSE(stream.inited());
     }
     EXPECT_EQ(stream.init(output(folder.file("a"), -1)), QvStatus::failed);
