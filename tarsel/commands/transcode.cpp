@@ -24,6 +24,7 @@ struct Given : GivenJob {
     OutputOptions outputs;
     ProgressOption progress;
     std::string threads, inputFormat, split;
+    SplitPlace place;
 };
 
 int parseBits(const std::string& text) {
@@ -109,10 +110,17 @@ void takeStandardInput(Given& given) {
         throw failure(Msg::stdinRefuses, {"--post with %i"});
 }
 
+// After "--", among the inputs. None of these begins like an option then, but as "./-name".
+void takeSchedulerOptions(Given& given) {
+    if (!given.place.slurm) return;
+    const auto isOption = [](const std::string& word) { return word.size() > 1 && word[0] == '-'; };
+    std::ranges::copy_if(given.job.inputs, std::back_inserter(given.place.options), isOption);
+    std::erase_if(given.job.inputs, isOption);
+}
+
 void takeSplit(Given& given) {
-    if (given.split.empty()) return;
-    if (given.job.standardInput) throw failure(Msg::stdinRefuses, {"--split"});
-    given.job.division = makeSplit(given.split);
+    given.job.division = makeSplit(given.split, given.place);
+    if (given.job.division && given.job.standardInput) throw failure(Msg::stdinRefuses, {"--split"});
 }
 
 }  // namespace
@@ -152,6 +160,7 @@ void transcode(Given& given, Signals& signals) {
     job.policy = given.outputs.policy();
     job.policy.recover = !job.dryRun;
     job.policy.quiet = job.quiet;
+    takeSchedulerOptions(given);
     takeStandardInput(given);
     resolveJob(given);
     takeSplit(given);
@@ -246,6 +255,8 @@ void addTranscode(CommandLine& line, Signals& signals, const std::string& versio
     command.flag("--strict", job.strict, "Let the job fail if there is a warning");
     command.flag("--unchanged", job.unchanged, "Let the job fail if an INPUT changes while it is read");
     command.option("--split", given->split, "Make the picture in N parts, side by side", "N");
+    command.flag("--slurm", given->place.slurm,
+                 "Make the parts on a cluster, by Slurm; after --: options for sbatch");
     addThreads(command, given->threads);
     command.flag("--dry-run", job.dryRun, "Print the plan and do nothing");
     given->outputs.add(command);
