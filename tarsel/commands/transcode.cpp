@@ -27,6 +27,8 @@ struct Given : GivenJob {
     SplitPlace place;
 };
 
+constexpr int kMostSchedulerOptions = 100;
+
 int parseBits(const std::string& text) {
     for (const int bits : {8, 16, 24})
         if (text == std::to_string(bits)) return bits;
@@ -246,6 +248,9 @@ void addTranscode(CommandLine& line, Signals& signals, const std::string& versio
     auto given = std::make_shared<Given>();
     JobOptions& job = given->job;
     addJobOptions(command, *given, Need::required);
+    // The parser ends at "--" where no argument is left, and gives these words to the inputs before them.
+    command.arguments("OPTION", given->place.options, "After --: options for sbatch, as --partition=NAME",
+                      kMostSchedulerOptions, Need::optional);
     command.group("");
     command.option("--input-format", given->inputFormat,
                    "What the standard input holds, as an extension: wav, ...", "EXT");
