@@ -2,7 +2,7 @@
 # Slurm on this machine alone, for as long as one command runs: munge, a controller and a node daemon with files
 # and ports of their own. It needs the Debian packages slurm-wlm and munge, and no service that is set up.
 #
-# usage: slurm-one-machine.sh                  runs a list of 20 tasks, with tarsel from PATH or $TARSEL
+# usage: slurm-one-machine.sh                  runs a list of 20 tasks and a job in parts, with tarsel from PATH or $TARSEL
 #        slurm-one-machine.sh COMMAND [ARG...] runs a command that may use sbatch, squeue, ...
 #
 # $SLURM_ONE_MACHINE is the folder with the configuration, the logs and the process numbers (munged.pid,
@@ -140,3 +140,9 @@ until_true 120 idle || fail "the tasks do not end"
 "$tool" batch "$list" status || exit
 left=$("$tool" batch "$list" status --json | grep -c '"state": "done"')
 [ "$left" = 20 ] || fail "$left of 20 tasks are done"
+
+# --- One job in parts, which has the bytes of the same job without a cluster.
+job=("testgen:size=320x240,rate=25,duration=20" --fade 2)
+"$tool" transcode "${job[@]}" -o "$work/parts.avi" --split 4 --slurm || exit
+"$tool" transcode "${job[@]}" -o "$work/whole.avi" || exit
+cmp "$work/parts.avi" "$work/whole.avi" || exit

@@ -2,6 +2,8 @@
 
 #include <algorithm>
 
+#include "tarsel/cluster/shellword.h"
+
 std::vector<TaskArray> arraysOf(const std::vector<TaskPlace>& places,
                                 const std::vector<std::vector<Before>>& order, size_t most) {
     const size_t count = places.size();
@@ -31,16 +33,6 @@ std::vector<TaskArray> arraysOf(const std::vector<TaskPlace>& places,
             }
         }
     return arrays;
-}
-
-std::string shellWord(const std::string& text) {
-    std::string word = "'";
-    for (const char c : text) {
-        // sbatch takes CR and LF side by side for a script of DOS and refuses it; '' between them is nothing.
-        if (c == '\n' && word.back() == '\r') word += "''";
-        word += c == '\'' ? std::string("'\\''") : std::string(1, c);
-    }
-    return word + "'";
 }
 
 std::string ElementScript::text() const {

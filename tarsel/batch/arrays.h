@@ -38,5 +38,3 @@ struct ElementScript {
     // No character in a word acts in the shell, whatever it is.
     std::string text() const;
 };
-// One word for the shell, in quotes.
-std::string shellWord(const std::string& text);

@@ -24,7 +24,10 @@ struct Given : GivenJob {
     OutputOptions outputs;
     ProgressOption progress;
     std::string threads, inputFormat;
+    SplitPlace place;
 };
+
+constexpr int kMostSchedulerOptions = 100;
 
 int parseBits(const std::string& text) {
     for (const int bits : {8, 16, 24})
@@ -109,6 +112,14 @@ void takeStandardInput(Given& given) {
         throw failure(Msg::stdinRefuses, {"--post with %i"});
 }
 
+// After "--", among the inputs. None of these begins like an option then, but as "./-name".
+void takeSchedulerOptions(Given& given) {
+    if (!given.place.slurm) return;
+    const auto isOption = [](const std::string& word) { return word.size() > 1 && word[0] == '-'; };
+    std::ranges::copy_if(given.job.inputs, std::back_inserter(given.place.options), isOption);
+    std::erase_if(given.job.inputs, isOption);
+}
+
 }  // namespace
 
 void resolveJob(GivenJob& given) {
@@ -150,8 +161,10 @@ void transcode(Given& given, Signals& signals) {
     job.policy = given.outputs.policy();
     job.policy.recover = !job.dryRun;
     job.policy.quiet = job.quiet;
+    takeSchedulerOptions(given);
     takeStandardInput(given);
     resolveJob(given);
+    job.division = makeSplit(given.split, given.place);
     runJob(given.job, [&] { return std::make_unique<Job>(given.job, signals); });
 }
 
@@ -235,6 +248,9 @@ void addTranscode(CommandLine& line, Signals& signals, const std::string& versio
     auto given = std::make_shared<Given>();
     JobOptions& job = given->job;
     addJobOptions(command, *given, Need::required);
+    // The parser ends at "--" where no argument is left, and gives these words to the inputs before them.
+    command.arguments("OPTION", given->place.options, "After --: options for sbatch, as --partition=NAME",
+                      kMostSchedulerOptions, Need::optional);
     command.group("");
     command.option("--input-format", given->inputFormat,
                    "What the standard input holds, as an extension: wav, ...", "EXT");
@@ -243,6 +259,8 @@ void addTranscode(CommandLine& line, Signals& signals, const std::string& versio
     given->progress.add(command);
     command.flag("--strict", job.strict, "Let the job fail if there is a warning");
     command.flag("--unchanged", job.unchanged, "Let the job fail if an INPUT changes while it is read");
+    command.flag("--slurm", given->place.slurm,
+                 "Make the parts of --split on a cluster, by Slurm; after --: options for sbatch");
     addThreads(command, given->threads);
     command.flag("--dry-run", job.dryRun, "Print the plan and do nothing");
     given->outputs.add(command);

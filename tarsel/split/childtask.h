@@ -2,11 +2,11 @@
 #pragma once
 
 #include <string>
-#include <utility>
 #include <vector>
 
 #include "tarsel/host/childprocess.h"
 #include "tarsel/job/progress.h"
+#include "tarsel/split/tasktalk.h"
 
 class ChildTask {
   public:
@@ -24,23 +24,17 @@ class ChildTask {
     // Takes what it has said. False when it will say no more.
     bool listen();
 
-    double part() const { return part_; }  // 0 to 1
-    long long frames() const { return frames_; }
-    double outSeconds() const { return outSeconds_; }
-    double speed() const { return speed_; }  // negative if unknown
+    double part() const { return talk_.part(); }  // 0 to 1
+    long long frames() const { return talk_.frames(); }
+    double outSeconds() const { return talk_.outSeconds(); }
+    double speed() const { return talk_.speed(); }  // negative if unknown
     // What came since the last call.
-    std::vector<std::string> takeWarnings() { return std::exchange(warnings_, {}); }
-    const std::string& failure() const { return failure_; }  // of its end; "" if it did not say
-    const std::vector<std::string>& outputs() const { return outputs_; }
+    std::vector<std::string> takeWarnings() { return talk_.takeWarnings(); }
+    const std::string& failure() const { return talk_.failure(); }  // of its end; "" if it did not say
+    const std::vector<std::string>& outputs() const { return talk_.outputs(); }
 
   private:
-    void take(const std::string& line);
-
     ChildProcess process_;
     RunningTime time_;
-    std::string heard_;  // of a line that has not ended
-    double part_ = 0, outSeconds_ = 0, speed_ = -1;
-    long long frames_ = 0;
-    std::vector<std::string> warnings_, outputs_;
-    std::string failure_;
+    TaskTalk talk_;
 };

@@ -6,10 +6,12 @@
 #include <mutex>
 #include <thread>
 
+#include "tarsel/cluster/slurm.h"
 #include "tarsel/host/files.h"
 #include "tarsel/host/outputs/workfolder.h"
 #include "tarsel/job/progress.h"
 #include "tarsel/job/warnings.h"
+#include "tarsel/split/clusterparts.h"
 #include "tarsel/split/localparts.h"
 #include "tarsel/split/partjoin.h"
 #include "tarsel/split/parttask.h"
@@ -26,7 +28,7 @@ constexpr double kJoinWeight = 0.05;   // of putting the parts together, as a sh
 
 class Split : public JobDivision {
   public:
-    explicit Split(int parts) : wanted_(parts) {}
+    Split(int parts, SplitPlace place) : wanted_(parts), place_(std::move(place)) {}
 
     int parts() const override { return wanted_; }
     void plan(const JobPlan& plan) override;
@@ -51,10 +53,13 @@ class Split : public JobDivision {
 
     void writeTasks(const Given& given, const fs::path& folder);
     void show(const Given& given);
+    std::unique_ptr<PartExecutor> makeExecutor(const Given& given) const;
     std::vector<PartState> carryOut(const Given& given);
     PartFiles filesOf(const std::vector<PartState>& states, const std::string& tiny) const;
 
     const int wanted_;
+    const SplitPlace place_;
+    const SlurmScheduler slurm_;
     SplitPlan split_;
     bool sound_ = false;
     std::vector<Part> parts_;  // those of the picture, then the sound
@@ -123,16 +128,25 @@ void Split::show(const Given& given) {
     if (given.progress.due()) given.progress.update(now());
 }
 
-// What each part has become; nothing when they were stopped.
-std::vector<PartState> Split::carryOut(const Given& given) {
+std::unique_ptr<PartExecutor> Split::makeExecutor(const Given& given) const {
+    const std::string& output = given.parts.plan.output.name;
+    std::vector<std::string> words;
+    if (given.options.acceptPartial) words.emplace_back("--accept-partial");
+    if (place_.slurm)
+        return std::make_unique<ClusterParts>(
+            slurm_, ClusterParts::How{words, place_.options, given.options.threads, output});
     const int cores = std::max(static_cast<int>(std::thread::hardware_concurrency()), 1);
     const int atOnce = std::min<int>(cores, static_cast<int>(parts_.size()));
     const int threads = given.options.threads > 0 ? given.options.threads : std::max(cores / atOnce, 1);
-    std::vector<std::string> words = {"--no-sync", "--threads", std::to_string(threads)};
-    if (given.options.acceptPartial) words.emplace_back("--accept-partial");
+    words.insert(words.end(), {"--no-sync", "--threads", std::to_string(threads)});
+    return std::make_unique<LocalParts>(atOnce, words, output);
+}
+
+// What each part has become; nothing when they were stopped.
+std::vector<PartState> Split::carryOut(const Given& given) {
     {
         const std::lock_guard guard(lock_);
-        executor_ = std::make_unique<LocalParts>(atOnce, words, given.parts.plan.output.name);
+        executor_ = makeExecutor(given);
     }
     const Ended ending(*this);
     executor_->begin(parts_);
@@ -206,12 +220,21 @@ ProgressState Split::now() const {
 
 }  // namespace
 
-std::shared_ptr<JobDivision> makeSplit(const std::string& parts) {
-    return std::make_shared<Split>(static_cast<int>(parseNumber(parts, kLeastParts, kMostParts, "--split")));
+std::shared_ptr<JobDivision> makeSplit(const std::string& parts, const SplitPlace& place) {
+    if (parts.empty()) {
+        if (place.slurm) throw failure(Msg::splitSlurmAlone);
+        return nullptr;
+    }
+    // One element is for the sound.
+    const int most = place.slurm ? static_cast<int>(SlurmScheduler::kMostElements) - 1 : kMostParts;
+    const int count = static_cast<int>(parseNumber(parts, kLeastParts, most, "--split"));
+    if (place.slurm) SlurmScheduler().checkOptions(place.options);
+    return std::make_shared<Split>(count, place);
 }
 
 // A number that is none comes from another program, whose task can be made in one piece.
 std::shared_ptr<JobDivision> storedSplit(const StoredTask& task) {
     const int parts = task.raw().getInt32(kSplitKey, 0);
-    return parts >= kLeastParts && parts <= kMostParts ? std::make_shared<Split>(parts) : nullptr;
+    return parts >= kLeastParts && parts <= kMostParts ? std::make_shared<Split>(parts, SplitPlace())
+                                                       : nullptr;
 }

@@ -2,12 +2,20 @@
 #pragma once
 
 #include <memory>
+#include <string>
+#include <vector>
 
 #include "tarsel/job/joboptions.h"
 #include "tarsel/job/task/storedtask.h"
 
-// A division of a job into so many parts, for JobOptions::division. Throws Failure (usage) for a number that
-// is none, or below 2.
-std::shared_ptr<JobDivision> makeSplit(const std::string& parts);
+// Where the parts are made.
+struct SplitPlace {
+    bool slurm = false;                // as elements of an array, not as processes of this machine
+    std::vector<std::string> options;  // for sbatch
+};
+
+// A division of a job into so many parts, for JobOptions::division; null for "". Throws Failure (usage) for a
+// number that is none, or below 2, and for a place without parts.
+std::shared_ptr<JobDivision> makeSplit(const std::string& parts, const SplitPlace& place = {});
 // The one that a task asks for; null for none.
 std::shared_ptr<JobDivision> storedSplit(const StoredTask& task);

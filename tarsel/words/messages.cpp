@@ -205,6 +205,8 @@ constexpr Message kMessages[] = {
     {Msg::splitFilter,       Exit::usage, "--split",                               "the filter {text} works on what was in front of a part as well", "leave one of them out"},
     {Msg::splitPartKilled,   Exit::failed, "can't make {file}",                    "the process of part {text} was ended by signal {text}",               "see whether memory is short, or take fewer parts"},
     {Msg::splitPartFailed,   Exit::failed, "can't make {file}",                    "part {text} failed with status {text} and gave no reason",     "run the job without --split"},
+    {Msg::splitPartLost,     Exit::failed, "can't make {file}",                    "part {text} was ended by the scheduler",                       "see whether it got enough time and memory"},
+    {Msg::splitSlurmAlone,   Exit::usage,  "--slurm",                              "it is for jobs in parts",                                      "give --split N, or 'tarsel batch LIST submit --slurm'"},
     {Msg::filterChannels,    Exit::usage,  "--filter {text}",                        "the sound has {text} channels, and it works on {text}", "take fewer with --channels"},
     {Msg::effectNoPicture,   Exit::usage,  "{option}",                               "this job has no picture",                               "leave it out"},
     {Msg::filterPlaceTaken,  Exit::usage,  "--filter {text}",                        "its one place in the chain is taken by another option", "leave one out"},

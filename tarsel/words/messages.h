@@ -205,6 +205,8 @@ enum class Msg : unsigned short {
     splitFilter,
     splitPartKilled,
     splitPartFailed,
+    splitPartLost,
+    splitSlurmAlone,
     filterChannels,
     effectNoPicture,
     filterPlaceTaken,

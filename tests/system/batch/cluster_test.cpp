@@ -399,4 +399,32 @@ TEST_F(RealSlurm, WhatWasCutOffIsDoneByTheNextSubmission) {
     EXPECT_EQ(litter(), std::set<std::string>());
 }
 
+TEST_F(RealSlurm, AJobInPartsHasTheBytesOfTheWhole) {
+    const Words job = {"transcode", "testgen:size=64x48,rate=29.97,duration=12.3", "--fade", "4", "-y"};
+    const auto split = [&](const Words& options) {
+        return tarsel(job + Words{"-o", "o' $(x)%j.avi", "--split", "3", "--slurm"} + options,
+                      surroundings());
+    };
+    works(job + Words{"-o", "whole.avi"});
+    EXPECT_EQ(split({"--", "--partition=all"}).status, 0);
+    EXPECT_TRUE(contents("o' $(x)%j.avi") == contents("whole.avi"));
+    fs::remove(folder.file("o' $(x)%j.avi"));
+    const std::set<std::string> before = listing();
+    failsAs(1, split({"--", "--partition=none"}), {"'sbatch' refuses"}, "partition");
+    failsAs(2, split({"--", "--array=1"}), {"can't be given"}, "own option");
+    failsAs(2, tarsel({"run", "t.xml", "--slurm"}), {"--split"}, "no parts");
+    EXPECT_EQ(listing(), before);
+    // One that is ended from outside fails the job, and the others are gone with it.
+    Process endless(words({"transcode", "testgen:size=640x480,rate=25,duration=20000", "--no-audio", "--size",
+                           "16x12", "-o", "long.avi", "--split", "2", "--slurm"}),
+                    surroundings());
+    ASSERT_TRUE(comes([&] { return lines(slurm({"squeue", "-h", "-r", "-t", "R"}).out).size() == 2; }));
+    EXPECT_EQ(slurm({"sh", "-c", "scancel $(squeue -h -r -o %i | head -n 1)"}).status, 0);
+    const Outcome end = endless.finish();
+    EXPECT_EQ(end.status, 1);
+    EXPECT_THAT(end.err, HasSubstr("can't make 'long.avi': part "));
+    EXPECT_EQ(slurm({"squeue", "-h"}).out, "");
+    EXPECT_EQ(listing(), before);
+}
+
 }  // namespace
