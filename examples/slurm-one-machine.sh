@@ -18,7 +18,12 @@ for program in munged slurmctld slurmd sbatch; do
 done
 [ "$(id -u)" = 0 ] || { echo "$0: a node daemon needs root" >&2; exit 1; }
 
+[ $# -gt 0 ] || command -v "$tool" >/dev/null || { echo "$0: there is no $tool; set TARSEL to its name" >&2; exit 5; }
+
 folder=$(mktemp -d "${TMPDIR:-/tmp}/slurm-one-machine.XXXXXX") || exit 1
+case $folder in
+*[!A-Za-z0-9._/-]*) rmdir "$folder"; echo "$0: Slurm takes no such TMPDIR: letters, digits, '.', '_', '-'" >&2; exit 1 ;;
+esac
 export SLURM_ONE_MACHINE=$folder SLURM_CONF=$folder/slurm.conf
 
 number_in() { cat "$folder/$1.pid" 2>/dev/null; }
@@ -68,15 +73,15 @@ fail() {
     exit 1
 }
 
-# Two ports that nothing listens on.
-free_port() {
+# Two ports that nothing listens on, an even one and an odd one.
+free_port() {  # FIRST
     local port
-    for port in $(shuf -i 20000-29999 -n 50); do
+    for port in $(seq "$1" 2 29999 | shuf -n 50); do
         (: <"/dev/tcp/127.0.0.1/$port") 2>/dev/null || { echo "$port"; return; }
     done
     return 1
 }
-controller_port=$(free_port) && node_port=$(free_port) || fail "no port is free"
+controller_port=$(free_port 20000) && node_port=$(free_port 20001) || fail "no port is free"
 
 mkdir "$folder/state" "$folder/spool" || exit 1
 (umask 077 && head -c 1024 /dev/urandom >"$folder/munge.key") || exit 1

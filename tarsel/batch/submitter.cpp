@@ -1,5 +1,8 @@
 #include "tarsel/batch/submitter.h"
 
+#include <chrono>
+#include <thread>
+
 #include <qvplugcore/qvplugcore.h>
 
 #include "tarsel/batch/journal.h"
@@ -14,6 +17,9 @@
 namespace {
 
 constexpr size_t kNameDigits = 16;  // of an array
+// So long are cancelled elements waited for: Slurm kills them after 30 s, where a site has set nothing else.
+constexpr int kEndTries = 80;
+constexpr std::chrono::milliseconds kEndPause{500};
 
 }  // namespace
 
@@ -140,11 +146,20 @@ bool Submitter::isUnknown(const std::string& name) const {
     }
 }
 
-std::vector<std::string> cancelSubmitted(const BatchFile& file, const Scheduler& scheduler) {
+CancelledJobs cancelSubmitted(const BatchFile& file, const Scheduler& scheduler) {
     requireFile(file.name());
     const Submissions submissions(file.queue());
-    const ClusterQueue queue(submissions, scheduler.elements(submissions.names()));
-    std::vector<std::string> jobs = queue.jobs();
-    scheduler.cancel(jobs);
-    return jobs;
+    const std::vector<std::string> names = submissions.names();
+    std::vector<ClusterElement> elements = scheduler.elements(names);
+    CancelledJobs cancelled;
+    cancelled.jobs = ClusterQueue(submissions, elements).jobs();
+    scheduler.cancel(cancelled.jobs);
+    // Those that run clean up first. Only then does a submission take them.
+    for (int tries = 0; !cancelled.jobs.empty(); ++tries) {
+        elements = scheduler.elements(names);
+        if (elements.empty() || tries == kEndTries) break;
+        std::this_thread::sleep_for(kEndPause);
+    }
+    cancelled.left = cancelled.jobs.empty() ? 0 : elements.size();
+    return cancelled;
 }

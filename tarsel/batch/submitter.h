@@ -53,5 +53,10 @@ class Submitter {
     int count_ = 0;
 };
 
-// Takes back what the scheduler has of a list: the jobs. Throws Failure.
-std::vector<std::string> cancelSubmitted(const BatchFile& file, const Scheduler& scheduler);
+struct CancelledJobs {
+    std::vector<std::string> jobs;
+    size_t left = 0;  // elements that have not ended yet
+};
+
+// Takes back what the scheduler has of a list, and waits a while for the end of what runs. Throws Failure.
+CancelledJobs cancelSubmitted(const BatchFile& file, const Scheduler& scheduler);

@@ -187,9 +187,10 @@ void submit(const Given& given, const BatchFile& file, const Scheduler& schedule
 }
 
 void cancel(const BatchFile& file) {
-    const Words jobs = cancelSubmitted(file, SlurmScheduler());
+    const auto [jobs, left] = cancelSubmitted(file, SlurmScheduler());
     if (jobs.empty()) return tell(Level::note, lineOf(Msg::schedulerNothing, {file.shown()}));
     tell(Level::note, (jobs.size() == 1 ? "job " : "jobs ") + joined(jobs) + " cancelled");
+    if (left > 0) tell(Level::warning, lineOf(Msg::schedulerEnds, {file.shown(), std::to_string(left)}));
 }
 
 // Options that mean the same in run and in submit.

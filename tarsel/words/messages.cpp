@@ -411,6 +411,7 @@ constexpr Message kMessages[] = {
     {Msg::schedulerUnknown,    Exit::usage,  "can't submit {file}",                   "no scheduler is named",                                     "give --slurm"},
     {Msg::schedulerSilent,     Exit::done,   "{file}",                                "what waits or runs on the cluster is not known ({text})",   ""},
     {Msg::schedulerNothing,    Exit::done,   "{file}",                                "the scheduler has none of its tasks",                       ""},
+    {Msg::schedulerEnds,       Exit::done,   "{file}",                                "{text} of its tasks have not ended yet",                    ""},
     // watched folders
     {Msg::watchNoFolder,       Exit::input,  "can't watch {file}",                 "{text}",                                              "{text}"},
     {Msg::watchFolderMissing,  Exit::usage,  "--preset {name}",                    "no folder follows the colon",                         "write NAME:FOLDER, or NAME alone"},

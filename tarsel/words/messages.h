@@ -411,6 +411,7 @@ enum class Msg : unsigned short {
     schedulerUnknown,
     schedulerSilent,
     schedulerNothing,
+    schedulerEnds,
     // watched folders
     watchNoFolder,
     watchFolderMissing,

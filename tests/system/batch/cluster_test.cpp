@@ -77,8 +77,10 @@ class FakeSlurm : public Cluster {
             for word; do case $word in --job-name=*) name=${word#*=};; --array=*) last=${word##*-};; esac; done
             for k in $(seq 0 ${last%%%*}); do echo "$name|$n|$k|PENDING" >>"$S/queue"; done; echo $n)");
         program("squeue", R"([ ! -e "$S/silent" ] || { echo "squeue: error: no contact" >&2; exit 1; }
-            [ -z "$SQUEUE_PARTITION" ] && cat "$S/queue")");
-        program("scancel", R"(shift; for job; do sed -i "/|$job|/d" "$S/queue"; done)");
+            [ -z "$SQUEUE_PARTITION" ] && cat "$S/queue"
+            [ ! -e "$S/ending" ] || { sed -i "/|\($(cat "$S/ending")\)|/d" "$S/queue"; rm "$S/ending"; })");
+        // What was cancelled is still there at the next question, as one that cleans up.
+        program("scancel", R"(shift; echo "$@" | sed 's/ /\\|/g' >"$S/ending")");
         program("sacct", R"([ -e "$S/ends" ] && cat "$S/ends")");
         folder.write("bin/queue", "");
         folder.write("bin/count", "0");
@@ -311,14 +313,53 @@ class RealSlurm : public Cluster {
     std::string slurmSays() const {
         return slurm({"sh", "-c", "squeue; sinfo -R; tail -n 30 '" + machine_.string() + "'/slurm*.log"}).out;
     }
-    // Ends a daemon at once and starts it again.
-    void breakDown(const std::string& daemon) const {
+    void endAtOnce(const std::string& daemon) const {
         const pid_t process = std::atoi(TempFolder::read((machine_ / (daemon + ".pid")).string()).c_str());
         ASSERT_GT(process, 1);
         EXPECT_EQ(kill(process, SIGKILL), 0);
         const std::string exe = "/proc/" + std::to_string(process) + "/exe";
         EXPECT_TRUE(comes([&] { return !fs::exists(exe); }));
+    }
+    void start(const std::string& daemon) const {
         EXPECT_EQ(slurm({"/usr/sbin/" + daemon, "-f", (machine_ / "slurm.conf").string()}).status, 0);
+    }
+    // Tasks that take long enough to be met at work.
+    void addLong(int count) const {
+        for (int n = 1; n <= count; ++n)
+            works({"batch", "l.xml", "add",
+                   "testgen:size=640x480,rate=25,duration=" + std::to_string(100 + n), "-o",
+                   std::to_string(n) + ".raw", "--no-audio", "--size", "16x12"});
+    }
+    // Of jobs with whose numbers new ones begin again: a node takes no second one of a number.
+    bool nodeIsFree() const {
+        const fs::directory_iterator spool(machine_ / "spool");
+        return std::none_of(begin(spool), end(spool), [](const auto& file) { return file.is_socket(); });
+    }
+    size_t queued() const { return lines(slurm({"squeue", "--noheader", "--array"}).out).size(); }
+    // Stops each element that is met, until those in the queue are all stopped: their jobs, by tasks.
+    std::map<std::string, std::string> hold() const {
+        std::map<std::string, std::string> held;
+        EXPECT_TRUE(comes([&] {
+            for (const Json& row : states())
+                if (row["state"] == "running" && row["job"].is_string() &&
+                    kill(processOf(row["id"]), SIGSTOP) == 0)
+                    held[row["id"]] = row["job"];
+            return held.size() == queued();
+        })) << slurmSays();
+        return held;
+    }
+    // Nothing was begun again once it was done, and all is.
+    void allAreDoneOnce(int longOnes) const {
+        for (const Json& row : states()) {
+            EXPECT_EQ(row["state"], "done") << row["error"];
+            const Words all = steps(row["id"]);
+            const auto done = std::find_if(
+                all.begin(), all.end(), [](const std::string& step) { return step.rfind("done", 0) == 0; });
+            EXPECT_EQ(std::distance(done, all.end()), 1) << testing::PrintToString(all);
+        }
+        for (int n = 1; n <= longOnes; ++n)
+            EXPECT_EQ(size(std::to_string(n) + ".raw"), (100 + n) * 25 * 16 * 12 * 4) << n;
+        EXPECT_EQ(litter(), std::set<std::string>());
     }
     std::set<std::string> litter() const {
         std::set<std::string> names;
@@ -355,20 +396,10 @@ TEST_F(RealSlurm, TwentyTasksAreAsALocalRunMakesThem) {
 
 // The elements are held in the middle of their work, so that nothing depends on how fast they are.
 TEST_F(RealSlurm, WhatWasCutOffIsDoneByTheNextSubmission) {
-    for (int n = 1; n <= 6; ++n)
-        works({"batch", "l.xml", "add", "testgen:size=640x480,rate=25,duration=" + std::to_string(100 + n),
-               "-o", std::to_string(n) + ".raw", "--no-audio", "--size", "16x12"});
+    addLong(6);
     works({"batch", "l.xml", "add", "in.wav", "-o", "7.wav"});
     EXPECT_EQ(submit().status, 0);
-    std::map<std::string, std::string> held;  // the jobs of tasks
-    const auto queued = [&] { return lines(slurm({"squeue", "--noheader", "--array"}).out).size(); };
-    ASSERT_TRUE(comes([&] {
-        for (const Json& row : states())
-            if (row["state"] == "running" && row["job"].is_string() &&
-                kill(processOf(row["id"]), SIGSTOP) == 0)
-                held[row["id"]] = row["job"];
-        return held.size() == queued();
-    })) << slurmSays();
+    const auto held = hold();
     ASSERT_GE(held.size(), 3u);
     const auto cancelled = held.begin(), killed = std::next(cancelled), left = std::next(killed);
     EXPECT_EQ(slurm({"scancel", cancelled->second}).status, 0);
@@ -379,24 +410,38 @@ TEST_F(RealSlurm, WhatWasCutOffIsDoneByTheNextSubmission) {
     const auto before = fs::file_time_type::clock::now();
     EXPECT_EQ(slurm({"scontrol", "update", "JobId=" + left->second, "Comment=note"}).status, 0);
     ASSERT_TRUE(comes([&] { return fs::exists(noted) && fs::last_write_time(noted) > before; }));
-    breakDown("slurmctld");
-    breakDown("slurmd");
+    for (const char* daemon : {"slurmctld", "slurmd"}) {
+        endAtOnce(daemon);
+        start(daemon);
+    }
     ASSERT_TRUE(comes([&] { return queued() == held.size() - 2; })) << slurmSays();
     for (const auto& [id, job] : held) kill(processOf(id), SIGCONT);
     ASSERT_TRUE(allEnd()) << slurmSays();
     EXPECT_THAT(submit().err, HasSubstr("2 tasks submitted"));
     ASSERT_TRUE(allEnd()) << slurmSays();
-    EXPECT_EQ(count("done"), 7u) << batch({"status"}).out;
-    // What was cut off has begun again, and nothing once it was done.
-    for (const Json& row : states()) {
-        const Words all = steps(row["id"]);
-        const auto done = std::find_if(all.begin(), all.end(),
-                                       [](const std::string& step) { return step.rfind("done", 0) == 0; });
-        EXPECT_EQ(std::distance(done, all.end()), 1) << testing::PrintToString(all);
-    }
-    for (int n = 1; n <= 6; ++n)
-        EXPECT_EQ(size(std::to_string(n) + ".raw"), (100 + n) * 25 * 16 * 12 * 4) << n;
-    EXPECT_EQ(litter(), std::set<std::string>());
+    allAreDoneOnce(6);
+}
+
+// A controller that forgets the list, as it does when it ends before it has noted what it was given.
+TEST_F(RealSlurm, WhatTheControllerForgetsRunsOnce) {
+    addLong(2);
+    fs::copy(machine_ / "state", machine_ / "before", fs::copy_options::recursive);
+    EXPECT_EQ(submit().status, 0);
+    const auto held = hold();
+    ASSERT_EQ(held.size(), 2u);
+    for (const char* daemon : {"slurmd", "slurmctld"}) endAtOnce(daemon);
+    fs::remove_all(machine_ / "state");
+    fs::rename(machine_ / "before", machine_ / "state");
+    start("slurmctld");
+    // The elements are there, and only their locks say so.
+    ASSERT_TRUE(comes([&] { return slurm({"squeue"}).status == 0; }));
+    EXPECT_EQ(queued(), 0u);
+    EXPECT_THAT(submit().err, HasSubstr("0 tasks submitted; 0 done before, 2 queued or running"));
+    start("slurmd");  // which ends them, as the controller does not know them
+    ASSERT_TRUE(comes([&] { return count("running") == 0 && nodeIsFree(); })) << slurmSays();
+    EXPECT_THAT(submit().err, HasSubstr("2 tasks submitted"));
+    ASSERT_TRUE(allEnd()) << slurmSays();
+    allAreDoneOnce(2);
 }
 
 TEST_F(RealSlurm, AJobInPartsHasTheBytesOfTheWhole) {
