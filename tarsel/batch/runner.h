@@ -8,12 +8,12 @@
 #include <vector>
 
 #include "tarsel/batch/batchfile.h"
-#include "tarsel/split/childtask.h"
 #include "tarsel/batch/order.h"
 #include "tarsel/batch/result.h"
 #include "tarsel/host/outputs/outputs.h"
 #include "tarsel/host/signals.h"
 #include "tarsel/job/progress.h"
+#include "tarsel/split/childtask.h"
 
 struct BatchOptions {
     int jobs = 1;         // processes at a time

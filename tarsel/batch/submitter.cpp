@@ -1,12 +1,10 @@
 #include "tarsel/batch/submitter.h"
 
-#include <chrono>
-#include <thread>
-
 #include <qvplugcore/qvplugcore.h>
 
 #include "tarsel/batch/journal.h"
 #include "tarsel/batch/snapshot.h"
+#include "tarsel/host/childprocess.h"
 #include "tarsel/host/clock.h"
 #include "tarsel/host/command.h"
 #include "tarsel/host/files.h"
@@ -19,7 +17,7 @@ namespace {
 constexpr size_t kNameDigits = 16;  // of an array
 // So long are cancelled elements waited for: Slurm kills them after 30 s, where a site has set nothing else.
 constexpr int kEndTries = 80;
-constexpr std::chrono::milliseconds kEndPause{500};
+constexpr int kEndPause = 500;  // ms between two questions
 
 }  // namespace
 
@@ -158,7 +156,7 @@ CancelledJobs cancelSubmitted(const BatchFile& file, const Scheduler& scheduler)
     for (int tries = 0; !cancelled.jobs.empty(); ++tries) {
         elements = scheduler.elements(names);
         if (elements.empty() || tries == kEndTries) break;
-        std::this_thread::sleep_for(kEndPause);
+        waitForAny({}, kEndPause);
     }
     cancelled.left = cancelled.jobs.empty() ? 0 : elements.size();
     return cancelled;

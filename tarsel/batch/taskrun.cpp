@@ -11,8 +11,8 @@
 #include "tarsel/host/outputs/recovery.h"
 #include "tarsel/job/job.h"
 #include "tarsel/job/storedjob.h"
-#include "tarsel/split/split.h"
 #include "tarsel/job/task/taskfiles.h"
+#include "tarsel/split/split.h"
 #include "tarsel/words/messages.h"
 
 namespace fs = std::filesystem;

@@ -19,7 +19,7 @@
 namespace {
 
 constexpr int kTick = 500;                  // ms
-constexpr std::chrono::seconds kEvery{2};   // the scheduler is asked
+constexpr int kEvery = 4;                   // ticks between two questions to the scheduler
 constexpr int kMostSilent = 30;             // answers that may be missing before its end is not waited for
 constexpr size_t kNameDigits = 16;          // of the array
 constexpr size_t kMostSaid = 1 << 20;       // bytes that are read at a time
@@ -82,7 +82,7 @@ void ClusterParts::begin(const std::vector<Part>& parts) {
     array.options.emplace_back("--no-requeue");
     job_ = scheduler_.submit(array);
     tell(Level::note, how_.output + ": " + std::to_string(parts.size()) + " parts submitted as job " + job_);
-    looked_ = Clock::now();
+    untilLook_ = kEvery;
 }
 
 bool ClusterParts::finished() const {
@@ -95,7 +95,7 @@ bool ClusterParts::wait() {
     for (size_t part = 0; part < parts_.size(); ++part)
         if (!states_[part].ended) listen(part);
     if (failed_ || cancelled_) takeBack();
-    if (!finished() && Clock::now() - looked_ >= kEvery) look();
+    if (!finished() && --untilLook_ <= 0) look();
     return !finished();
 }
 
@@ -134,7 +134,7 @@ void ClusterParts::end(size_t part, int status) {
 
 // An element that the scheduler does not have, twice, and that has left no status, has not come to its end.
 void ClusterParts::look() {
-    looked_ = Clock::now();
+    untilLook_ = kEvery;
     std::set<size_t> living;
     try {
         for (const ClusterElement& element : scheduler_.elements({name_})) living.insert(element.index);

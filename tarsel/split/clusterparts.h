@@ -3,7 +3,6 @@
 #pragma once
 
 #include <atomic>
-#include <chrono>
 #include <set>
 #include <string>
 #include <vector>
@@ -37,8 +36,6 @@ class ClusterParts : public PartExecutor {
     void pause(bool) override {}
 
   private:
-    using Clock = std::chrono::steady_clock;
-
     std::string script(const std::vector<Part>& parts) const;
     void listen(size_t part);
     void end(size_t part, int status);
@@ -54,8 +51,8 @@ class ClusterParts : public PartExecutor {
     std::vector<long long> heard_;  // bytes of what each has said
     std::set<size_t> missed_;       // that the scheduler did not have when it was asked last, or before
     std::string name_, job_;        // of the array
-    Clock::time_point looked_;
-    int silent_ = 0;  // times in a row that the scheduler did not answer
+    int untilLook_ = 0;             // ticks
+    int silent_ = 0;                // times in a row that the scheduler did not answer
     bool failed_ = false, takenBack_ = false, gone_ = false;
     Bell bell_;
     std::atomic<bool> cancelled_{false};
