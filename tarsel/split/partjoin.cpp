@@ -12,11 +12,11 @@ namespace fs = std::filesystem;
 namespace {
 
 // Where the samples of a WAV file begin.
-long long samplesAt(const std::string& file) {
+size_t samplesAt(const std::string& file) {
     constexpr size_t kForm = 12, kHead = 8, kMost = 1 << 16;  // bytes: "RIFF....WAVE", id and size, looked at
     const std::string bytes = firstBytes(file, kMost);
     for (size_t at = kForm; at + kHead <= bytes.size();) {
-        if (bytes.compare(at, 4, "data") == 0) return static_cast<long long>(at + kHead);
+        if (bytes.compare(at, 4, "data") == 0) return at + kHead;
         size_t size = 0;
         for (size_t i = 0; i < 4; ++i)
             size |= static_cast<size_t>(static_cast<unsigned char>(bytes[at + 4 + i])) << 8 * i;
@@ -81,7 +81,7 @@ class Multiplexed {
     }
 
     QvFilePart samplesOf(const PlannedStream& stream, const std::string& file) const {
-        return {Any(file.c_str()), samplesAt(file), stream.bytes(stream.expected)};
+        return {Any(file.c_str()), static_cast<long long>(samplesAt(file)), stream.bytes(stream.expected)};
     }
 
     void settings() {
