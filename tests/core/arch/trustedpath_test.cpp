@@ -45,7 +45,7 @@ TEST_F(TrustedPath, WhoMayWrite) {
         {"out/plugins", 01777, geteuid(), own, plugins + write},  // anybody may add a dependency
         {"out", 0757, geteuid(), own, out + write},
         {"out", 01777, geteuid(), own, ""},  // as /tmp: what is ours in it stays ours
-        // Root alone can give files away.
+        // Root alone can give files away, and only to users that its namespace knows.
         {"out/plugins/x.so", 0644, 12345, 0, "belongs to another user"},
         {"out/plugins", 0755, 12345, 0, plugins + "which belongs to another user"},
         {"out", 01755, 12345, 0, out + "which belongs to another user"},
@@ -58,9 +58,10 @@ TEST_F(TrustedPath, WhoMayWrite) {
     };
     for (const auto& c : cases) {
         const bool ours = c.owner == geteuid() && c.group == own;
-        if (!ours && geteuid() != 0) continue;
         SCOPED_TRACE(testing::Message() << c.name << ' ' << std::oct << c.bits << ' ' << std::dec << c.owner);
-        ASSERT_EQ(chown(path(c.name).c_str(), c.owner, c.group), 0);
+        const bool given = chown(path(c.name).c_str(), c.owner, c.group) == 0;
+        if (!ours && !given) continue;
+        ASSERT_TRUE(given);
         mode(c.name, c.bits);
         EXPECT_EQ(reason(file), c.reason);
         EXPECT_EQ(reason(file, QvLibraryTrust::anyone), "");
@@ -103,11 +104,9 @@ TEST_F(TrustedPath, LinksAreFollowedAndTheirFoldersChecked) {
     for (const auto& c : cases) EXPECT_EQ(reason(path(c.name)), c.reason);
     EXPECT_EQ(reason(""), "does not exist");
     EXPECT_EQ(reason("/"), "is a folder");
-    if (geteuid() == 0) {
-        ASSERT_EQ(lchown(path("safe/folder").c_str(), 12345, 0), 0);
-        EXPECT_EQ(reason(path("safe/folder/x.so")),
-                  "is reached by the link '" + path("safe/folder") + "', which belongs to another user");
-    }
+    if (lchown(path("safe/folder").c_str(), 12345, 0) != 0) GTEST_SKIP() << "may not give files away";
+    EXPECT_EQ(reason(path("safe/folder/x.so")),
+              "is reached by the link '" + path("safe/folder") + "', which belongs to another user");
 }
 
 }  // namespace
