@@ -74,7 +74,7 @@ long long pictureBytes(const AnyDict& params, std::string& problem) {
 // What of uncompressed data is not whole.
 std::string wholeProblem(const QvFileMuxStream& stream, long long length) {
     std::string problem;
-    const long long whole = stream.wholeBytes(problem);
+    const long long whole = stream.recorded ? 0 : stream.wholeBytes(problem);
     if (whole == 0) return problem;
     const bool video = stream.type == qvVideoStream;
     for (std::size_t i = 0; i < stream.units.size(); ++i)
@@ -85,6 +85,10 @@ std::string wholeProblem(const QvFileMuxStream& stream, long long length) {
     if (length % whole == 0) return "";
     return std::string("after the last whole ") + (video ? "picture" : "sample") + " there are " +
            std::to_string(length % whole) + " bytes";
+}
+
+bool takesRecords(const QvMuxer& muxer) {
+    return muxer.module() && muxer.module()->getAttr("recorder").isValid();
 }
 
 }  // namespace
@@ -191,6 +195,10 @@ int QvFileMux::checkMuxer(QvMuxer& muxer, QvBufStream& output) {
     QvFileMuxConfig none;
     if (muxer.muxElementaryStreams(none, output) == QvStatus::failed && !*muxer.errorDesc())
         return fail(QvStatus::failed, std::string(muxer.name()) + " does not multiplex files");
+    for (std::size_t i = 0; i < config_.streams.size(); ++i)
+        if (config_.streams[i].recorded && !takesRecords(muxer))
+            return fail(QvStatus::invalidArgument,
+                        config_.place(i) + ": " + muxer.name() + " takes no recorded units");
     const Any limits = muxer.getParam("maxStreams");
     if (!limits.isDict()) return QvStatus::ok;
     constexpr int any = std::numeric_limits<int>::max();

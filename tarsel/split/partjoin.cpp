@@ -5,6 +5,7 @@
 #include <span>
 
 #include "tarsel/host/files.h"
+#include "tarsel/split/splitplan.h"
 #include "tarsel/words/messages.h"
 
 namespace fs = std::filesystem;
@@ -50,6 +51,10 @@ class Multiplexed {
     bool write(const std::string& output, bool withSound, const std::function<bool(double)>& watch) {
         size_t sound = 0;
         for (const PlannedStream& stream : parts_.plan.streams) {
+            if (isFilm(parts_.plan)) {
+                addRecorded(stream);
+                continue;
+            }
             if (!stream.isVideo() && !withSound) continue;
             std::vector<QvFilePart> data;
             if (stream.isVideo())
@@ -80,6 +85,21 @@ class Multiplexed {
                                                "bytes of its parts", std::to_string(wanted)});
     }
 
+    // All sounds are in one file.
+    void addRecorded(const PlannedStream& stream) {
+        std::vector<QvFilePart> data;
+        if (stream.isVideo())
+            for (const PartPictures& part : files_.pictures) data.push_back({Any(part.files.at(0).c_str())});
+        else
+            data.push_back({Any(files_.sounds.at(0).c_str())});
+        const std::string encoder = stream.encoder();
+        QvFileMuxStream& to = mux_.config().addStream(stream.type, data.front().file, Any(encoder.c_str()));
+        parts_.pipe->getMuxer()->getStreamParams(stream.type, stream.number, to.params);
+        takeFormat(to, *parts_.encoder(stream));
+        to.parts = std::move(data);
+        to.recorded = true;
+    }
+
     QvFilePart samplesOf(const PlannedStream& stream, const std::string& file) const {
         return {Any(file.c_str()), static_cast<long long>(samplesAt(file)), stream.bytes(stream.expected)};
     }
@@ -88,7 +108,18 @@ class Multiplexed {
         AnyDict state;
         parts_.pipe->getMuxer()->store(state);
         for (const char* key : {"name", "displayName", "filename"}) state.remove(key);
+        if (isFilm(parts_.plan)) {
+            state.set("_totalFrames", static_cast<int>(pictureOf(parts_.plan).expected));
+            if (const Any meta = metaOfInput(); !state.isSet("tags") && meta.isDict())
+                state.set("meta", meta);
+        }
         mux_.config().output = state;
+    }
+
+    // As a run gives it to the multiplexer.
+    Any metaOfInput() const {
+        const Source& source = parts_.source(pictureOf(parts_.plan));
+        return static_cast<const QvCodec&>(source.decoder()).getParam("meta");
     }
 
     const JobParts& parts_;

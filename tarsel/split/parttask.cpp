@@ -17,10 +17,17 @@ void keepStreams(AnyDict& state, bool video) {
     state.set("streams", kept);
 }
 
-// Each stream into a file of its own, as it is.
-void writePlain(AnyDict& encoder) {
-    encoder.set("muxer", AnyDict("name", "rawmux"));
-    encoder.set("profile", static_cast<int>(QvProfile::raw));
+// What is put together afterwards: units of a film, or each stream in a file of its own, as it is.
+void writeParts(AnyDict& encoder, const JobPlan& plan) {
+    std::string muxer = "rawmux";
+    int profile = QvProfile::raw;
+    if (isFilm(plan)) {
+        muxer = recorderOf(plan);
+        const QvModule* const module = qv_registry()->module(muxer.c_str());
+        if (module) profile = module->getAttr("profile").asInt32(profile);
+    }
+    encoder.set("muxer", AnyDict("name", muxer.c_str()));
+    encoder.set("profile", profile);
     encoder.remove("presetName");
 }
 
@@ -111,7 +118,7 @@ AnyDict pictureTask(const AnyDict& whole, const JobPlan& plan, const SplitPlan& 
         muxer.set("allPictures", static_cast<int>(pictureOf(plan).expected));
         encoder.set("muxer", muxer);
     } else {
-        writePlain(encoder);
+        writeParts(encoder, plan);
     }
     setOutput(state, encoder, output);
     return state;
@@ -145,7 +152,7 @@ AnyDict soundTask(const AnyDict& whole, const JobPlan& plan, const std::string& 
     for (const Any& one : encoder.getVector("streams"))
         encoders.append(one.asDict().getInt32("type", 0) == qvVideoStream ? Any(tinyEncoder(picture)) : one);
     encoder.set("streams", encoders);
-    writePlain(encoder);
+    writeParts(encoder, plan);
     setOutput(state, encoder, output);
     return state;
 }

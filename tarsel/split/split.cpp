@@ -91,9 +91,9 @@ std::string Split::text() const {
 void Split::writeTasks(const Given& given, const fs::path& folder) {
     const JobPlan& plan = given.parts.plan;
     const std::string stem = fs::path(given.output).stem().string();
-    const auto outputOf = [&](const std::string& name, const char* extension) {
+    const auto outputOf = [&](const std::string& name, const std::string& end) {
         makeFolder((folder / name).string());
-        return (folder / name / stem).string() + extension;
+        return (folder / name / stem).string() + end;
     };
     const auto add = [&](const std::string& name, double weight, const AnyDict& task) {
         const std::string file = (folder / (name + ".xml")).string(), reason = writeTask(task, file);
@@ -101,7 +101,9 @@ void Split::writeTasks(const Given& given, const fs::path& folder) {
         parts_.push_back({file, weight});
     };
     parts_.clear();
-    const char* const extension = plan.output.kind == OutputKind::pictures ? ".png" : ".raw";
+    const std::string extension = isFilm(plan) ? fs::path(given.output).extension().string()
+                                  : plan.output.kind == OutputKind::pictures ? ".png"
+                                                                             : ".raw";
     for (size_t part = 0; part < split_.parts(); ++part) {
         const std::string name = std::to_string(part + 1), output = outputOf(name, extension);
         add(name, static_cast<double>(split_.frames(part)),
@@ -111,7 +113,7 @@ void Split::writeTasks(const Given& given, const fs::path& folder) {
     const std::string tiny = (folder / "tiny.i420").string();
     makeHole(tiny, tinyBytes(plan));
     add("sound", static_cast<double>(split_.points.back()) * kSoundWeight,
-        soundTask(given.task, plan, tiny, outputOf("sound", ".raw")));
+        soundTask(given.task, plan, tiny, outputOf("sound", isFilm(plan) ? extension : ".raw")));
 }
 
 void Split::show(const Given& given) {

@@ -35,7 +35,7 @@ void requireWholeFilters(const JobPlan& plan, const PlannedStream& picture) {
 void requireKind(const JobPlan& plan) {
     const OutputForm& output = plan.output;
     const bool kind = output.kind == OutputKind::raw || output.kind == OutputKind::pictures ||
-                      output.kind == OutputKind::avi;
+                      output.kind == OutputKind::avi || isFilm(plan);
     if (!output.isFiles() || !kind) throw failure(Msg::splitOutput, {output.name});
     if (plan.count(qvVideoStream) != 1) throw failure(Msg::splitPictures, {output.name});
 }
@@ -49,12 +49,22 @@ long long ownFrames(const JobPlan& plan, const PlannedStream& picture) {
 }
 
 // Frames of the input.
+long long prerollOf(const std::string& filter) {
+    const QvModule* const module = qv_registry()->module(filter.c_str());
+    return module ? std::max(module->getAttr("preroll").asInt32(0), 0) : 0;
+}
+
 long long prerollOf(const PlannedStream& picture) {
     long long frames = 0;
-    for (const Any& name : picture.filters.names(true))
-        if (const QvModule* const module = qv_registry()->module(name.asString("")))
-            frames += std::max(module->getAttr("preroll").asInt32(0), 0);
+    for (const Any& name : picture.filters.names(true)) frames += prerollOf(name.asString(""));
     return frames;
+}
+
+// "" if there is none. Coded pictures that are only there to fill its memory can't be cut off again.
+std::string rememberingFilter(const PlannedStream& picture) {
+    for (const Any& name : picture.filters.names(true))
+        if (prerollOf(name.asString("")) > 0) return name.asString("");
+    return "";
 }
 
 long long leadOf(const JobPlan& plan, const PlannedStream& picture, long long unit) {
@@ -66,6 +76,12 @@ long long leadOf(const JobPlan& plan, const PlannedStream& picture, long long un
 }
 
 }  // namespace
+
+std::string recorderOf(const JobPlan& plan) {
+    const QvModule* const muxer =
+        plan.output.kind == OutputKind::module ? qv_registry()->module(plan.output.muxer()) : nullptr;
+    return muxer ? muxer->getAttr("recorder").asString("") : "";
+}
 
 const PlannedStream& pictureOf(const JobPlan& plan) {
     return *std::ranges::find_if(plan.streams, &PlannedStream::isVideo);
@@ -86,6 +102,8 @@ SplitPlan planSplit(const JobPlan& plan, int parts) {
     requireKind(plan);
     const PlannedStream& picture = pictureOf(plan);
     requireWholeFilters(plan, picture);
+    if (const std::string filter = isFilm(plan) ? rememberingFilter(picture) : ""; !filter.empty())
+        throw failure(Msg::splitFilter, {filter});
     const long long unit = splitUnit(plan), own = ownFrames(plan, picture);
     SplitPlan split;
     split.points = {0};

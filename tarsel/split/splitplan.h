@@ -1,6 +1,7 @@
 // Where the picture of one long job is divided, so that several processes can make a part each.
 #pragma once
 
+#include <string>
 #include <vector>
 
 #include "tarsel/job/plan/jobplan.h"
@@ -17,6 +18,11 @@ struct SplitPlan {
     long long lead(size_t part) const { return first(part) < leadIn ? first(part) : leadIn; }
     long long frames(size_t part) const { return points[part + 1] - points[part]; }
 };
+
+// The multiplexer that records units of the encoders, of which that of the job makes its film. "" for outputs
+// whose parts are plain files.
+std::string recorderOf(const JobPlan& plan);
+inline bool isFilm(const JobPlan& plan) { return !recorderOf(plan).empty(); }
 
 // The first one of a plan that has one.
 const PlannedStream& pictureOf(const JobPlan& plan);

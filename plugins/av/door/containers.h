@@ -6,6 +6,8 @@
 
 namespace av {
 
+inline constexpr const char* recorderModule = "unitmux";
+
 struct MuxerModule {
     const char* name;
     const char* description;

@@ -11,6 +11,8 @@ struct OwnPreset {
     const char *video, *audio, *muxers;  // names separated by ' ', the default first
 };
 
+inline constexpr int ownPresetOfAll = 0x2800030;  // every codec and every multiplexer
+
 inline constexpr OwnPreset ownPresets[] = {
     {0x2800001, "AV_WEB_H264", "H.264 for the web", "Web", "h264venc", "aacaenc", "mp4mux"},
     {0x2800002, "AV_WEB_H265", "H.265", "Web", "h265venc", "aacaenc", "mp4mux mkvmux rawmux"},
@@ -25,11 +27,12 @@ inline constexpr OwnPreset ownPresets[] = {
     {0x2800022, "AV_FLAC", "FLAC", "Sound", "", "flacaenc", "flacmux oggmux"},
     {0x2800023, "AV_OPUS", "Opus", "Sound", "", "opusaenc", "oggmux"},
     // What is asked for by the names of codecs alone.
-    {0x2800030, "AV_ANY", "Any codecs", "Any",
+    {ownPresetOfAll, "AV_ANY", "Any codecs", "Any",
      "h264venc h265venc av1venc mpegvenc mpeg4venc vc3venc dvvenc dv100venc mj2kvenc proresvenc ffv1venc "
      "rawvenc",
      "aacaenc mpegaenc mpegpcmenc mp3aenc ddaenc ddproaenc ddplusproaenc flacaenc opusaenc rawaenc",
-     "mkvmux movmux mp4mux mxfmux mptsmux mpegpsmux webmmux dvavimux dvmux y4mmux flacmux oggmux rawmux"},
+     "mkvmux movmux mp4mux mxfmux mptsmux mpegpsmux webmmux dvavimux dvmux y4mmux flacmux oggmux rawmux "
+     "unitmux"},
 };
 
 // "" for a number that none of them has.

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cstring>
 #include <memory>
+#include <utility>
 #include <vector>
 
 #include "core/arch/qvcancel.h"
@@ -14,6 +15,7 @@
 #include "core/stream/qvbytesource.h"
 #include "plugins/av/mux/containers.h"
 #include "plugins/av/mux/picturetiming.h"
+#include "plugins/av/mux/unitlog.h"
 #include "plugins/av/source/avheaders.h"
 #include "plugins/av/source/mediainput.h"
 #include "plugins/wire.h"
@@ -57,7 +59,9 @@ class FileStream : public QvEncoder {
 
 class Feed {
   public:
-    Feed(const QvFileMuxStream& stream, const QvModule* module) : stream_(stream), encoder_(module, stream) {}
+    // `number`: of the stream within its type.
+    Feed(const QvFileMuxStream& stream, int number, const QvModule* module)
+        : stream_(stream), number_(number), encoder_(module, stream) {}
     Feed(const Feed&) = delete;
     Feed& operator=(const Feed&) = delete;
     ~Feed() {
@@ -75,6 +79,7 @@ class Feed {
 
   private:
     const QvFileMuxStream& stream_;
+    const int number_;
     FileStream encoder_;
     QvBufStream* to_ = nullptr;
     std::unique_ptr<MediaInput> input_;     // of coded data
@@ -88,12 +93,22 @@ class Feed {
     double perSecond_ = 1;
     long long bytes_ = 0, read_ = 0;
     bool done_ = false;
+    UnitLogReader log_;  // of recorded units
+    UnitLogEntry entry_;
+    std::size_t file_ = 0;              // of them
+    long long start_ = 0, frames_ = 0;  // pictures in front of that file and in it, as far as it was read
+    std::vector<UnitLogEntry> heads_;   // of the first file
+    std::size_t head_ = 0;              // of this one
 
     bool video() const { return stream_.type == qvVideoStream; }
     const AVStream& stream() const { return *input_->context().streams[0]; }
     std::string send(unsigned id, void* record, unsigned size);
     std::string put(const unsigned char* data, std::size_t bytes);
     std::string stepRaw();
+    std::string openLog();
+    std::string stepRecorded();
+    std::string sendHead();
+    std::string sendUnit();
     std::string sendVideo();
     std::string sendSound();
 };
@@ -103,11 +118,13 @@ std::string Feed::join(QvMuxer& muxer) {
     std::string problem;
     whole_ = stream_.wholeBytes(problem);
     if (!problem.empty()) return problem;
+    if (stream_.recorded && !(problem = openLog()).empty()) return problem;
     perSecond_ = video() ? stream_.framerate.rate().ratio() : std::max(stream_.samplerate, 1);
-    source_ = qvFileSource(stream_.file, 1);
-    bytes_ = source_ ? source_->size() : 0;
-    if (bytes_ < 1) return "it can't be opened, or is empty";
-    if (whole_ == 0) {
+    bytes_ = stream_.length();
+    if (!stream_.recorded && whole_ > 0)
+        source_ = stream_.parts.empty() ? qvFileSource(stream_.file, 1) : qvFilePartsSource(stream_.parts, 1);
+    if (bytes_ < 1 || (!stream_.recorded && whole_ > 0 && !source_)) return "it can't be opened, or is empty";
+    if (!stream_.recorded && whole_ == 0) {
         input_ = MediaInput::open(MediaBytes(stream_.file), "", problem);
         if (!input_) return problem;
         const AVMediaType type = stream().codecpar->codec_type;
@@ -131,7 +148,7 @@ std::string Feed::send(unsigned id, void* record, unsigned size) {
 }
 
 std::string Feed::begin() {
-    if (whole_ > 0) return "";
+    if (whole_ > 0 || stream_.recorded) return "";
     const AVCodecParameters& is = *stream().codecpar;
     const std::uint32_t fourcc = muxFourcc(is.codec_id);
     if (video()) {
@@ -183,6 +200,7 @@ std::string Feed::put(const unsigned char* data, std::size_t bytes) {
 }
 
 std::string Feed::step() {
+    if (stream_.recorded) return stepRecorded();
     if (whole_ > 0) return stepRaw();
     const MediaInput::Read read = input_->read(*packet_);
     if (read == MediaInput::Read::failed) return input_->failure();
@@ -234,6 +252,76 @@ std::string Feed::stepRaw() {
     return send(QvAuxId::VIDEO_AU_CODE, &unit, sizeof unit);
 }
 
+// --- Recorded units.
+
+std::string Feed::openLog() {
+    head_ = 0;
+    start_ += std::exchange(frames_, 0);
+    return log_.open(stream_.parts.empty() ? stream_.file : stream_.parts[file_].file);
+}
+
+std::string Feed::stepRecorded() {
+    switch (log_.next(stream_.type, number_, entry_)) {
+        case UnitLogReader::Read::failed: return "part " + std::to_string(file_ + 1) + ": " + log_.problem();
+        case UnitLogReader::Read::end:
+            done_ = ++file_ >= std::max<std::size_t>(stream_.parts.size(), 1);
+            return done_ ? "" : openLog();
+        default: break;
+    }
+    read_ += static_cast<long long>(entry_.bytes.size());
+    if (entry_.id == QvAuxId::VIDEO_STREAM_INFO || entry_.id == QvAuxId::AUDIO_STREAM_INFO) return sendHead();
+    if (std::string why = put(entry_.bytes.data(), entry_.bytes.size()); !why.empty()) return why;
+    if (whole_ > 0 && !video()) next_ += static_cast<long long>(entry_.bytes.size()) / whole_;
+    return entry_.id == 0 ? "" : sendUnit();
+}
+
+// The parts have one head, or they are no parts of one stream.
+std::string Feed::sendHead() {
+    if (file_ > 0) {
+        const UnitLogEntry* const first = head_ < heads_.size() ? &heads_[head_++] : nullptr;
+        if (first && first->info == entry_.info && first->bytes == entry_.bytes) return "";
+        return "part " + std::to_string(file_ + 1) + " is coded in another way than the first";
+    }
+    heads_.push_back(entry_);
+    const auto known = [&](auto head) {
+        if (entry_.info.size() != sizeof head) return std::string("its head is none of this version");
+        std::memcpy(&head, entry_.info.data(), sizeof head);
+        head.extradata = entry_.bytes.data();
+        head.extradataBytes = entry_.bytes.size();
+        return send(entry_.id, &head, sizeof head);
+    };
+    return entry_.id == QvAuxId::VIDEO_STREAM_INFO ? known(QvWire::VideoHead{}) : known(QvWire::AudioHead{});
+}
+
+std::string Feed::sendUnit() {
+    QvWire::VideoUnit unit{};
+    if (!video()) {
+        QvWire::AudioUnit sound{};
+        if (entry_.info.size() == sizeof sound) {
+            std::memcpy(&sound, entry_.info.data(), sizeof sound);
+            next_ += sound.sampleCount();
+        }
+    } else if (entry_.info.size() == sizeof unit) {
+        std::memcpy(&unit, entry_.info.data(), sizeof unit);
+        const bool timed = (unit.flags & QvWire::unitTimed) != 0;
+        constexpr std::int64_t far = std::int64_t{1} << 40;
+        if (unit.pts < -far || unit.pts > far || unit.dts < -far || unit.dts > far)
+            return "part " + std::to_string(file_ + 1) + " has an impossible time";
+        const std::int64_t shown = std::max<std::int64_t>(unit.duration, 1);
+        frames_ = timed ? std::max<long long>(frames_, unit.pts + shown) : frames_ + shown;
+        if (timed) {
+            unit.pts += start_;
+            unit.dts += start_;
+        }
+        std::memcpy(entry_.info.data(), &unit, sizeof unit);
+        ++next_;
+    } else {
+        ++frames_;
+        ++next_;
+    }
+    return send(entry_.id, entry_.info.data(), static_cast<unsigned>(entry_.info.size()));
+}
+
 // The stream that is farthest behind is next.
 int feedAll(std::vector<std::unique_ptr<Feed>>& feeds, QvFileMuxConfig& config, std::string& error) {
     for (;;) {
@@ -259,10 +347,12 @@ int run(QvMuxer& muxer, std::vector<std::unique_ptr<Feed>>& feeds, QvFileMuxConf
         error = config.place(at) + ": " + why;
         return QvStatus::failed;
     };
+    int numbers[] = {0, 0};  // of pictures and sounds
     for (std::size_t i = 0; i < config.streams.size(); ++i) {
         const QvFileMuxStream& stream = config.streams[i];
         const Any codec = stream.codec.toString();
-        feeds.push_back(std::make_unique<Feed>(stream, qv_registry()->module(codec.asString(""))));
+        int& number = numbers[stream.type == qvVideoStream ? 0 : 1];
+        feeds.push_back(std::make_unique<Feed>(stream, number++, qv_registry()->module(codec.asString(""))));
         if (const std::string why = feeds[i]->join(muxer); !why.empty()) return fail(i, why);
     }
     int result = muxer.open();

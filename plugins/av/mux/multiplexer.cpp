@@ -20,6 +20,7 @@
 #include "plugins/av/mux/filmwriter.h"
 #include "plugins/av/mux/muxoptions.h"
 #include "plugins/av/mux/muxtrack.h"
+#include "plugins/av/mux/unitrecorder.h"
 #include "plugins/av/mux/unitstream.h"
 
 namespace av {
@@ -346,6 +347,7 @@ int Multiplexer::muxElementaryStreams(QvFileMuxConfig& config, QvBufStream& outp
 }
 
 QvCodec* newMultiplexer(const char* module) {
+    if (std::strcmp(module, recorderModule) == 0) return new UnitRecorder;
     const Container* const container = containerOf(module);
     return container ? new Multiplexer(*container) : nullptr;
 }

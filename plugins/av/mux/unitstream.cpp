@@ -12,6 +12,7 @@
 #include "core/stream/iofailure.h"
 #include "plugins/av/mux/filmwriter.h"
 #include "plugins/av/mux/multiplexer.h"
+#include "plugins/av/mux/unitlog.h"
 #include "plugins/av/source/limits.h"
 
 namespace av {
@@ -38,9 +39,19 @@ bool read(T& to, const void* info, unsigned size) {
 
 }  // namespace
 
-class UnitStream::Record final : public Bufstream {
+class UnitStream::Record : public Bufstream {
   public:
-    Record(UnitStream& stream, FilmWriter& film, std::size_t track)
+    virtual bool finish() = 0;
+
+    unsigned chunksize() override { return chunkBytes; }
+    unsigned split() override { return BUFSTREAM_FAILED; }
+    void done(int) override {}
+    void free() override {}
+};
+
+class UnitStream::FilmRecord final : public Record {
+  public:
+    FilmRecord(UnitStream& stream, FilmWriter& film, std::size_t track)
         : stream_(stream), film_(film), track_(track), raw_(film.track(track).raw()) {
         init();
         const MuxTrack& is = film.track(track);
@@ -52,7 +63,6 @@ class UnitStream::Record final : public Bufstream {
     }
 
     unsigned usable() override { return mostBytes - filled_; }
-    unsigned chunksize() override { return chunkBytes; }
     unsigned char* request(unsigned n) override {
         if (film_.failed() || n > usable() || !reserve(n)) return nullptr;
         return buffer_->data + filled_;
@@ -85,11 +95,8 @@ class UnitStream::Record final : public Bufstream {
         // Encoders of raw data ask the stream for the reason only if it took the announcement.
         return ok || raw_ ? 0 : BUFSTREAM_FAILED;
     }
-    unsigned split() override { return BUFSTREAM_FAILED; }
-    void done(int) override {}
-    void free() override {}
 
-    bool finish() {
+    bool finish() override {
         if (sample_ > 0) return putSound() && filled_ == 0;
         return filled_ == 0;
     }
@@ -222,6 +229,90 @@ class UnitStream::Record final : public Bufstream {
     }
 };
 
+// Bytes go to the log before there are more than a chunk of them, so that its memory is bounded.
+class UnitStream::LogRecord final : public Record {
+  public:
+    LogRecord(UnitStream& stream, UnitLog& log, int type, int number) : stream_(stream), log_(log) {
+        init();
+        entry_.type = type;
+        entry_.number = number;
+    }
+
+    unsigned usable() override { return chunkBytes; }
+    unsigned char* request(unsigned n) override {
+        if (n > chunkBytes || !log_.problem().empty()) return nullptr;
+        if (filled_ + n > chunkBytes && !put(0)) return nullptr;
+        entry_.bytes.resize(filled_ + n);
+        return entry_.bytes.data() + filled_;
+    }
+    unsigned confirm(unsigned n) override {
+        n = std::min(n, static_cast<unsigned>(entry_.bytes.size()) - filled_);
+        filled_ += n;
+        return n;
+    }
+    unsigned copybytes(unsigned char* p, unsigned n) override {
+        for (unsigned copied = 0; copied < n;) {
+            const unsigned now = std::min(n - copied, chunkBytes);
+            unsigned char* const to = request(now);
+            if (!to) return copied;
+            std::memcpy(to, p + copied, now);
+            copied += confirm(now);
+        }
+        return n;
+    }
+    unsigned auxinfo(unsigned, unsigned id, void* info, unsigned size) override {
+        switch (id) {
+            case QvAuxId::VIDEO_STREAM_INFO: return head<QvWire::VideoHead>(id, info, size);
+            case QvAuxId::AUDIO_STREAM_INFO: return head<QvWire::AudioHead>(id, info, size);
+            case QvAuxId::VIDEO_AU_CODE:
+            case QvAuxId::AUDIO_AU_CODE: {
+                const auto* const from = static_cast<const std::uint8_t*>(info);
+                entry_.info.assign(from, from ? from + size : from);
+                return put(id) ? 0 : BUFSTREAM_FAILED;
+            }
+            default: return 0;
+        }
+    }
+
+    bool finish() override { return filled_ == 0 || put(0); }
+
+  private:
+    UnitStream& stream_;
+    UnitLog& log_;
+    UnitLogEntry entry_;
+    unsigned filled_ = 0;
+
+    bool put(unsigned id) {
+        entry_.id = id;
+        entry_.bytes.resize(filled_);
+        const bool ok = log_.add(entry_);
+        entry_.info.clear();
+        filled_ = 0;
+        if (!ok) fail(EIO, log_.problem());
+        return ok;
+    }
+
+    void fail(int code, const std::string& problem) {
+        const Any name = stream_.getParam("outfilename");
+        stream_.failure()->note(code, problem.c_str(),
+                                name.isText() ? qv_wide_name(qv_os_name(name)) : QvWideString());
+    }
+
+    // Its own data take the place of the unit's bytes, as the address says nothing in another process.
+    template <class Head>
+    unsigned head(unsigned id, const void* info, unsigned size) {
+        Head head{};
+        if ((filled_ > 0 && !put(0)) || !read(head, info, size)) return BUFSTREAM_FAILED;
+        const auto* const own = static_cast<const std::uint8_t*>(head.extradata);
+        if (own) entry_.bytes.assign(own, own + head.extradataBytes);
+        filled_ = static_cast<unsigned>(own ? head.extradataBytes : 0);
+        head.extradata = nullptr;
+        const auto* const from = reinterpret_cast<const std::uint8_t*>(&head);
+        entry_.info.assign(from, from + sizeof head);
+        return put(id) ? 0 : BUFSTREAM_FAILED;
+    }
+};
+
 UnitStream::UnitStream(QvCodec* owner) : QvBufStream(owner) { setParam("writeThrough", 1); }
 
 UnitStream::~UnitStream() = default;
@@ -229,8 +320,16 @@ UnitStream::~UnitStream() = default;
 bufstream* UnitStream::input() { return record_ ? record_->record() : nullptr; }
 
 int UnitStream::begin(FilmWriter& film, std::size_t track) {
+    return begin(std::make_unique<FilmRecord>(*this, film, track));
+}
+
+int UnitStream::begin(UnitLog& log, int type, int number) {
+    return begin(std::make_unique<LogRecord>(*this, log, type, number));
+}
+
+int UnitStream::begin(std::unique_ptr<Record> record) {
     if (const int result = QvBufStream::init(params())) return result;
-    record_ = std::make_unique<Record>(*this, film, track);
+    record_ = std::move(record);
     setInited(true);
     return QvStatus::ok;
 }
