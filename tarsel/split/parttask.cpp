@@ -2,6 +2,7 @@
 
 #include <algorithm>
 
+#include "tarsel/job/plan/timecodes.h"
 #include "tarsel/job/task/divide.h"
 #include "tarsel/job/task/storedtask.h"
 
@@ -79,6 +80,25 @@ void divideProcess(ProcessParams& process, const JobPlan& plan, const SplitPlan&
     process.setFilters(*filters);
 }
 
+// Some encoders write a timecode into the stream.
+void moveTimecode(AnyDict& encoder, const PlannedStream& picture, long long first) {
+    AnyVector streams = encoder.getVector("streams");
+    AnyDict stream = streams.at(0).asDict();
+    if (!stream.get("codec").isDict()) return;
+    AnyDict codec = stream.get("codec").asDict();
+    if (!codec.get("settingsDict").isDict()) return;
+    AnyDict settings = codec.get("settingsDict").asDict();
+    const std::string text = settings.get("timecode").asString("");
+    if (text.empty()) return;
+    const QvFramerate& rate = picture.picture.rate;
+    const std::string moved = movedTimecode(text, rate, rate, [&](const QvFramerate&) { return first; });
+    settings.set("timecode", moved.c_str());
+    codec.set("settingsDict", settings);
+    stream.set("codec", codec);
+    streams.set(0, stream);
+    encoder.set("streams", streams);
+}
+
 AnyDict tinyFile(const PlannedStream& picture, const std::string& name) {
     AnyDict decoder("name", "rawdec", "FOURCC", "I420", "width", kTiny, "height", kTiny);
     decoder.set("framerate", Any(picture.picture.rate));
@@ -112,6 +132,7 @@ AnyDict pictureTask(const AnyDict& whole, const JobPlan& plan, const SplitPlan& 
 
     AnyDict encoder = state.get("encoder").asDict();
     keepStreams(encoder, true);
+    moveTimecode(encoder, pictureOf(plan), split.first(part) - split.lead(part));
     if (plan.output.kind == OutputKind::pictures) {
         AnyDict muxer = encoder.get("muxer").asDict();
         muxer.set("firstPicture", static_cast<int>(split.first(part) - split.lead(part)));

@@ -199,7 +199,7 @@ constexpr Message kMessages[] = {
     {Msg::filterNoStream,    Exit::usage,  "--filter {text}",                        "this job has no {text}",                                "leave it out"},
     {Msg::filterNotDivided,  Exit::usage,  "--filter {text}",                     "it would begin anew in each segment",                          "leave it out, and filter the joined output in a second run"},
     {Msg::splitNoPicture,    Exit::usage, "--split",                               "{name} gets no picture, and sound is not divided",             "leave it out"},
-    {Msg::splitOutput,       Exit::usage, "--split",                               "{name} can't be put together from parts",                      "write raw pictures, a sequence of PNG files or an AVI file, or leave it out"},
+    {Msg::splitOutput,       Exit::usage, "--split",                               "{name} can't be put together from parts",                      "write a film, raw pictures, a sequence of PNG files or an AVI file, or leave it out"},
     {Msg::splitPictures,     Exit::usage, "--split",                               "{name} would get several pictures",                            "write one of them, or leave it out"},
     {Msg::splitJoin,         Exit::usage, "--split",                               "the job for {name} has several segments",                      "run each segment by itself, or leave it out"},
     {Msg::splitFilter,       Exit::usage, "--split",                               "the filter {text} works on what was in front of a part as well", "leave one of them out"},

@@ -4,9 +4,13 @@
 #include <chrono>
 #include <fstream>
 
+#include <nlohmann/json.hpp>
+
 #include "tests/system/tool.h"
 
 namespace {
+
+using Json = nlohmann::json;
 
 class SplitJob : public Tool {
   protected:
@@ -34,6 +38,22 @@ class SplitJob : public Tool {
         for (const auto& entry : std::filesystem::directory_iterator(folder.file(in)))
             names.insert(entry.path().filename().string());
         return names;
+    }
+    // All that is said of a film but its sizes.
+    Json factsOf(const std::string& film) const {
+        Json facts = Json::parse(works({"info", "--exact", "--json", film}).out).at(0);
+        facts.erase("file");
+        facts.erase("bytes");
+        for (Json& stream : facts["streams"]) stream.erase("bit_rate");
+        return facts;
+    }
+    // The timecodes of an MPEG-2 stream.
+    static std::set<std::string> groupTimes(const std::string& film) {
+        std::set<std::string> times;
+        const std::string mark("\0\0\1\xb8", 4);
+        for (size_t at = 0; (at = film.find(mark, at)) != std::string::npos; at += 4)
+            times.insert(film.substr(at + 4, 3));
+        return times;
     }
     // A job that only a signal ends, once its parts are at work.
     static Words endless() {
@@ -75,10 +95,50 @@ TEST_F(SplitJob, GivesTheBytesOfTheWhole) {
         {{"testgen:size=192x96,rate=25,duration=2,audio=0", "--timecode=10:00:00:00", "--subtitles", "s.srt"},
          "a.v210"},
     };
+    const Words prores = {"--vcodec", "prores", "--meta", "timecode=10:00:00;00", "--language", "eng"};
+    isEqual(Words{small + "29.97,duration=12.3", "--acodec", "aac"} + prores, "a.mov");
+    isEqual({small + "25,duration=2", "--no-audio"}, "a.y4m");
     folder.write("s.srt",
                  "1\n00:00:00,300 --> 00:00:01,500\nfirst\n\n2\n00:00:01,600 --> 00:00:01,900\nsecond\n");
     for (const auto& row : rows) isEqual(row.job, row.output);
     isEqual({small + "25,duration=0.2"}, "a.avi", "100");  // more parts than frames
+}
+
+// Pictures that depend on each other: the coder begins again in each part, and nothing else differs.
+TEST_F(SplitJob, FilmsOfPartsHaveThePicturesAndTimesOfTheWhole) {
+    const struct {
+        const char* source;
+        Words coded;
+        const char *whole, *parts;
+        const char* leastPsnr;
+    } rows[] = {
+        {"rate=29.97,duration=12.3", {"--vcodec", "ffv1", "--acodec", "flac"}, "a.mkv", "b.mkv", "100"},
+        {"rate=29.97,duration=12.3",
+         {"--vcodec", "h264:preset=ultrafast", "--meta", "title=One"},
+         "c.mp4",
+         "d.mp4",
+         "30"},
+        {"rate=25,duration=12",
+         {"--vcodec", "mpeg2:N=10", "--meta", "timecode=10:00:00:00"},
+         "e.mkv",
+         "f.mkv",
+         "30"},
+    };
+    for (const auto& row : rows) {
+        SCOPED_TRACE(row.whole);
+        const Words job = Words{"transcode", "testgen:size=96x64,rate=29.97,duration=12.3"} + row.coded +
+                          Words{"--no-sync"};
+        works(job + Words{"-o", row.whole});
+        const Words split = job + Words{"-o", row.parts, "--split", "3"};
+        EXPECT_THAT(works(split + Words{"--dry-run"}).out, testing::HasSubstr("begins with a key frame"));
+        works(split);
+        EXPECT_EQ(factsOf(row.parts), factsOf(row.whole));
+        works({"compare", row.whole, row.parts, "--min-psnr", row.leastPsnr});
+        works({"transcode", row.whole, "-o", "whole.wav", "--no-video", "-y"});
+        works({"transcode", row.parts, "-o", "parts.wav", "--no-video", "-y"});
+        EXPECT_TRUE(contents("parts.wav") == contents("whole.wav"));
+    }
+    EXPECT_EQ(groupTimes(contents("f.mkv")), groupTimes(contents("e.mkv")));
 }
 
 TEST_F(SplitJob, AStoredTaskAndThePlan) {
@@ -107,10 +167,13 @@ TEST_F(SplitJob, WhatCanNotBeDividedIsRefused) {
     refuses({"transcode", clip},
             {{{"-o", "a.avi", "--split", "1"}, {"--split", "2 to 10000"}},
              {{"-o", "a.wav", "--no-video", "--split", "2"}, {"'a.wav'", "no picture"}},
-             {{"-o", "a.mp4", "--split", "2"}, {"'a.mp4'"}},
              {{"-o", "a.avi", "--cut", "0-0.2", "--cut", "0.4-0.6", "--split", "2"},
               {"'a.avi'", "several segments"}},
              {{"-o", "/dev/null", "--format", "i420", "--no-audio", "--split", "2"}, {"--split"}}});
+    fails(2,
+          {"transcode", "testgen:size=64x48,rate=25i,duration=1", "-o", "a.mp4", "--deinterlace=double",
+           "--split", "2"},
+          {"bobber"});
     fails(2, {"transcode", "-", "--input-format", "wav", "-o", "a.avi", "--split", "2"}, {"--split"});
 }
 

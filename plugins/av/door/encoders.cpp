@@ -17,7 +17,8 @@ struct EncoderModule {
     int type;
     const char* description;
     const char* displayName;
-    const char* muxers;  // more than the engine's own table has, separated by ' '
+    const char* muxers;     // more than the engine's own table has, separated by ' '
+    bool onlyKeys = false;  // each picture is coded by itself
 };
 
 constexpr int video = QvModuleType::videoEncoder;
@@ -28,12 +29,12 @@ constexpr EncoderModule modules[] = {
     {"h264venc",      video, "H.264 encoder",          "H.264",      "rawmux mp4mux movmux mkvmux mptsmux mpegpsmux mxfmux"},
     {"mpegvenc",      video, "MPEG-1 and -2 encoder",  "MPEG-1/2",   "rawmux mp4mux movmux mkvmux mptsmux mpegpsmux mxfmux"},
     {"mpeg4venc",     video, "MPEG-4 Visual encoder",  "MPEG-4",     "rawmux mp4mux movmux mkvmux mptsmux"},
-    {"vc3venc",       video, "VC-3 (DNxHD, DNxHR) encoder", "VC-3",  "rawmux movmux mkvmux mxfmux"},
-    {"dvvenc",        video, "DV encoder",             "DV",         "rawmux dvmux dvavimux movmux mkvmux mxfmux"},
-    {"dv100venc",     video, "DVCPRO HD encoder",      "DVCPRO HD",  "rawmux dv100mux dvavimux movmux mkvmux mxfmux"},
-    {"mj2kvenc",      video, "JPEG 2000 encoder",      "JPEG 2000",  "rawmux mj2mux movmux mkvmux mxfmux"},
+    {"vc3venc",       video, "VC-3 (DNxHD, DNxHR) encoder", "VC-3",  "rawmux movmux mkvmux mxfmux", true},
+    {"dvvenc",        video, "DV encoder",             "DV",         "rawmux dvmux dvavimux movmux mkvmux mxfmux", true},
+    {"dv100venc",     video, "DVCPRO HD encoder",      "DVCPRO HD",  "rawmux dv100mux dvavimux movmux mkvmux mxfmux", true},
+    {"mj2kvenc",      video, "JPEG 2000 encoder",      "JPEG 2000",  "rawmux mj2mux movmux mkvmux mxfmux", true},
     {"h265venc",      video, "H.265 encoder",          "H.265",      "rawmux mp4mux movmux mkvmux mptsmux"},
-    {"proresvenc",    video, "ProRes encoder",         "ProRes",     "movmux mkvmux mxfmux"},
+    {"proresvenc",    video, "ProRes encoder",         "ProRes",     "movmux mkvmux mxfmux", true},
     {"ffv1venc",      video, "FFV1 encoder",           "FFV1",       "mkvmux"},
     {"av1venc",       video, "AV1 encoder",            "AV1",        "webmmux mkvmux mp4mux"},
     {"aacaenc",       audio, "AAC encoder",            "AAC",        "rawmux mp4mux movmux mkvmux mptsmux mpegpsmux"},
@@ -65,6 +66,7 @@ void addEncoders(QvPlugin& plugin, const std::shared_ptr<CodecLibrary>& library)
     for (const EncoderModule& row : modules) {
         QvModule* const module = newModule(library, row.type, row.name, row.description, row.displayName);
         module->setAttr("compatMuxers", wordsOf(row.muxers));
+        if (row.onlyKeys) module->setAttr("onlyKeys", 1);
         plugin.addModule(module);
     }
     AnyVector presets;

@@ -44,6 +44,7 @@ void addMultiplexers(QvPlugin& plugin, const std::shared_ptr<CodecLibrary>& libr
         newModule(library, QvModuleType::muxer, recorderModule, "Recorder of encoded units", "Units");
     recorder->setAttr("compatEncoders", encodersOf(ownPresetOfAll));
     recorder->setAttr("sizedStreams", 1);
+    recorder->setAttr("internal", 1);
     recorder->setAttr("profile", ownPresetOfAll);
     plugin.addModule(recorder);
 }

@@ -5,6 +5,7 @@
 #include <filesystem>
 #include <optional>
 
+#include "tarsel/job/plan/timecodes.h"
 #include "tarsel/source/wavwords.h"
 #include "tarsel/words/messages.h"
 #include "tarsel/words/xmlnames.h"
@@ -68,11 +69,8 @@ class Part {
         std::string text = textOf(meta_.get("timecode"));
         if (text.empty()) text = textOf(meta_.get("startTimecode"));
         if (text.empty() || !stream_.isVideo() || input_.video.empty()) return text;
-        const bool drops = text.find(';') != std::string::npos;
-        const QvFramerate from = counted(input_.video.front().picture.rate, drops);
-        const QvFramerate to = counted(stream_.picture.rate, drops);
-        const long long start = QvTimecode(text.c_str()).frameNr(from, false);
-        return formatted(start + in().position(from), from, to);
+        return movedTimecode(text, input_.video.front().picture.rate, stream_.picture.rate,
+                             [this](const QvFramerate& from) { return in().position(from); });
     }
 
   private:
@@ -81,34 +79,6 @@ class Part {
     std::string name() const {
         const std::string title = textOf(meta_.get("title"));
         return title.empty() ? std::filesystem::path(input_.name).stem().string() : title;
-    }
-
-    // Numbers are dropped at 30000/1001 and 60000/1001.
-    static QvFramerate counted(const QvFramerate& rate, bool drops) {
-        const QvRatio r = rate.rate();
-        const bool ntsc = r.den == 1001 && (r.num == 30000 || r.num == 60000);
-        return QvFramerate(r, 0, drops && ntsc);
-    }
-
-    // At another rate the second stays, and the frame is the one that is shown then.
-    static std::string formatted(long long frame, const QvFramerate& from, const QvFramerate& to) {
-        constexpr long long day = 24 * 3600;
-        const auto nominal = [](const QvFramerate& rate) {
-            return std::max<long long>(1, static_cast<long long>(rate.rate().ratio() + 0.999));
-        };
-        frame %= day * nominal(from);
-        QvTimecode code(static_cast<int>(frame), from, false);
-        if (nominal(from) != nominal(to) || from.df() != to.df()) {
-            const long long count = code.frames() * nominal(to) / nominal(from);
-            code = QvTimecode(code.hours(), code.minutes(), code.seconds(), static_cast<int>(count));
-            // Numbers that the rate drops are those of the frame after them.
-            code = QvTimecode(code.frameNr(to, false), to, false);
-        }
-        char text[QvTimecode::textSize];
-        code.pprint(text, false);
-        std::string written = text;
-        if (to.df()) written[8] = ';';
-        return written;
     }
 
     const PlannedStream& stream_;
