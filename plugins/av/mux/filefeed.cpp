@@ -279,7 +279,7 @@ std::string Feed::stepRecorded() {
 std::string Feed::sendHead() {
     if (file_ > 0) {
         const UnitLogEntry* const first = head_ < heads_.size() ? &heads_[head_++] : nullptr;
-        if (first && first->info == entry_.info && first->bytes == entry_.bytes) return "";
+        if (first && *first == entry_) return "";
         return "part " + std::to_string(file_ + 1) + " is coded in another way than the first";
     }
     heads_.push_back(entry_);

@@ -25,6 +25,8 @@ struct UnitLogEntry {
     unsigned id = 0;
     std::vector<std::uint8_t> info;
     std::vector<std::uint8_t> bytes;
+
+    bool operator==(const UnitLogEntry&) const = default;
 };
 
 // A digest of all bytes, fed piece by piece.
