@@ -2,8 +2,6 @@
 
 #include <algorithm>
 
-#include "core/measure/timecode.h"
-
 namespace {
 
 QvFramerate counted(const QvFramerate& rate, bool drops) {

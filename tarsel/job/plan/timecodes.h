@@ -1,10 +1,10 @@
 // Timecodes of films, as texts.
 #pragma once
 
+#include <qvplugcore/qvplugcore.h>
+
 #include <functional>
 #include <string>
-
-#include "core/measure/qvgeometry.h"
 
 // What `text`, a timecode of frames at the rate `from`, has become `frames` later, for pictures at the rate
 // `to`: the second stays, and the frame is the one that is shown then. The text has a ';' where it drops
