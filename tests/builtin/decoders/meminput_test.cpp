@@ -261,6 +261,7 @@ TEST_F(MemoryInput, SaysWhatItLacks) {
     const auto block = [&wav] { return qvBlockSource(wav.data(), wav.size()); };
     EXPECT_EQ(refusal(nullptr, "x.wav"), "x.wav is in memory, and no source of its bytes is set");
     EXPECT_EQ(refusal(block(), "x.flac"), "x.flac: there is no decoder for the extension 'flac'");
+    EXPECT_EQ(refusal(block(), "X.WAV"), "opened");
     EXPECT_EQ(refusal(block(), "x"), "x: there is no decoder for the extension ''");
     EXPECT_EQ(refusal(block(), "x.yuv"), "x.yuv: rawdec needs 'FOURCC'");
     EXPECT_EQ(refusal(block(), "x.wav", AnyDict("invert", 1)),

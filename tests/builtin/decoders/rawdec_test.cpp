@@ -133,6 +133,17 @@ TEST_F(Raw, SizesAndFormatsThatCanNotBeAreRefused) {
     EXPECT_EQ(outcome(decoder.open()), "-1 Can not open file");
 }
 
+TEST_F(Raw, OneStreamOfPicturesIsDescribed) {
+    decoder.setParam("FOURCC", "I420"), decoder.setParam("width", 48), decoder.setParam("height", 20);
+    AnyDict params;
+    decoder.getStreamParams(qvVideoStream, 0, params);
+    EXPECT_EQ(params.getInt32("width", 0), 48);
+    for (const auto& [type, stream] : {std::pair(qvVideoStream, 1), std::pair(qvAudioStream, 0)}) {
+        decoder.getStreamParams(type, stream, params);
+        EXPECT_TRUE(params.empty()) << type;
+    }
+}
+
 TEST_F(Raw, SettingsAreStored) {
     const std::pair<const char*, Any> rows[] = {
         {"FOURCC", "UYVY"},    {"width", 48}, {"height", 20},        {"framerate", QvFramerate(50.0)},

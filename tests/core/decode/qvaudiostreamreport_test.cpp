@@ -27,7 +27,7 @@ TEST(AudioStreamReport, PeaksOfEachWidthHaveOneScale) {
         {1, "\x80\x80\x81\x80"s, 1 << 8},      {1, "\x80\x80\x00\xFF"s, 32768},
         {2, "\0\0\x01\0\xFE\xFF\0\0"s, 2},     {2, "\0\x80\xFF\x7F"s, 32768},
         {3, "\0\0\0\0\x05\0\0\0\0\0\0\0"s, 5}, {3, "\0\0\x80\xFF\xFF\x7F"s, 32768},
-        {3, "\xFF\xFF\xFF\0\0\0"s, 0},
+        {3, "\xFF\xFF\xFF\0\0\0"s, 0},         {3, "\0\0\0\0\0\x60"s, 0x6000},
     };
     for (const auto& c : cases) {
         QvAudioStreamReport report;

@@ -19,6 +19,13 @@ class Muxer : public BaseMuxer {
     };
 };
 
+TEST(BaseMuxer, AnswersForOneProgramOfOnePictureAndSound) {
+    const Muxer muxer;
+    EXPECT_EQ(muxer.QvCodec::getParam("programsSupported"), Any(0));
+    EXPECT_EQ(muxer.QvCodec::getParam("maxStreams"),
+              Any(AnyDict("vids", 1, "auds", 1, "subs", 0, "total", 2)));
+}
+
 TEST(BaseMuxer, KeepsOneListForEachType) {
     {
         Muxer muxer;

@@ -1,5 +1,6 @@
 #include "core/encode/qvencodepipe.h"
 
+#include "core/encode/encodefactory.h"
 #include "core/job/filtersstate.h"
 #include "core/measure/qvgeometry.h"
 #include "tests/support/checks.h"
@@ -11,6 +12,13 @@ struct Pipe : testing::Test {
     FailingOutputs outputs_;
     std::unique_ptr<QvEncodePipe> pipe_{QvEncodePipe::create()};
 };
+
+TEST_F(Pipe, AFactoryMakesThemWithAndWithoutSettings) {
+    for (QvEncodePipe* made : {QvEncFactory::encodePipe(), QvEncFactory::encodePipe(AnyDict("any", 1))}) {
+        const std::unique_ptr<QvEncodePipe> owner(made);
+        EXPECT_NE(made, nullptr);
+    }
+}
 
 // The pipe has one stream of each kind.
 TEST_F(Pipe, RoomForStreams) {

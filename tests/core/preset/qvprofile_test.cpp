@@ -1,5 +1,6 @@
 #include "core/preset/qvprofile.h"
 
+#include "core/engine/qvutil.h"
 #include "tests/support/checks.h"
 
 namespace {
@@ -17,10 +18,18 @@ TEST(Profile, SymbolsOfTheCurrentSchemeComeFirst) {
 }
 
 TEST(Profile, NumbersOfTheOldestSchemeAreLifted) {
-    const Pair cases[] = {{0, 0x1000064},         {13, 0x100001E},        {27, 0x100003E},
-                          {28, 0x1000064},        {0xFFFFFF, 0x1000064},  {-1, 0x1000064},
-                          {0x1000000, 0x1000000}, {0x2000000, 0x2000000}, {INT_MAX, INT_MAX}};
+    const Pair cases[] = {{0, 0x1000064},    {10, 0x100000D},        {13, 0x100001E},
+                          {27, 0x100003E},   {28, 0x1000064},        {0xFFFFFF, 0x1000064},
+                          {-1, 0x1000064},   {0x1000000, 0x1000000}, {0x2000000, 0x2000000},
+                          {INT_MAX, INT_MAX}};
     for (const Pair& c : cases) EXPECT_EQ(qvFixOldProfileNo(c.first), c.second) << c.first;
+}
+
+TEST(Profile, XdcamExIsKnownInBothSchemes) {
+    for (const int profile : {0x1000016, 0x20E0000, 0x20E0001})
+        EXPECT_TRUE(QvUtil::isExProfile(profile)) << profile;
+    for (const int profile : {-1, 0, 0x1000015, 0x20D0001, 0x20F0000, 0x41C0000})
+        EXPECT_FALSE(QvUtil::isExProfile(profile)) << profile;
 }
 
 TEST(Profile, OldDescriptionsGetACurrentNumber) {
@@ -46,6 +55,7 @@ TEST(Profile, OldDescriptionsGetACurrentNumber) {
         {0x100004C, 11, "mpeg4venc", "3GP_MPEG4"},
         {0x1000048, 99, "mpeg4venc", "3GP_H263"},
         {0, 18, "mpeg4venc", "MPEG4_HD"},
+        {0, 18, "h264venc", "AVCINTRA_50"},
         {0x1000024, 8, "h264venc", "3GP_H264"},
         {0x1000026, 8, "stdh264venc", "H264_MAIN"},
         {0x1000027, 8, "stdh264venc", "BD_H264"},

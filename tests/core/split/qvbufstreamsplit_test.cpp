@@ -185,6 +185,7 @@ TEST_F(QvBsSplitAudioTest, RefusesWhatNoWavCanHold) {
         EXPECT_FALSE(stream.inited());
     }
     EXPECT_TRUE(namesIn(folder).empty());
+    EXPECT_TRUE(wavFormatIsLegal({.samplerate = 1, .channels = 1, .bitsPerSample = 1}));
     // The bytes of a sample of all channels are a field of 16 bits.
     for (const int channels : {32'767, 32'768})
         EXPECT_EQ(wavFormatIsLegal({.samplerate = 48'000, .channels = channels, .bitsPerSample = 16}),

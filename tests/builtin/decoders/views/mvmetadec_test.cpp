@@ -88,6 +88,7 @@ TEST_F(MvMetaDec, EveryLayoutShowsTheSameFrameOfAllViews) {
         SCOPED_TRACE(layout);
         const auto decoder = open(layout.c_str());
         ASSERT_EQ(fault, "");
+        EXPECT_EQ(decoder->QvCodec::getParam("layout"), Any(layout.c_str()));
         const bool chain = layout == "interleaved" || layout == "swapped";
         EXPECT_EQ(decoder->getVideoParam(0, "nrViews"), Any(chain ? 3 : 1));
         EXPECT_EQ(decoder->nrFrames(0), 6);
