@@ -1,9 +1,12 @@
 #include "plugins/av/picture/decodedpictures.h"
 
 #include <algorithm>
+#include <cstdint>
+#include <cstring>
 #include <utility>
 
 #include "core/arch/platform.h"
+#include "plugins/av/picture/picturewords.h"
 #include "plugins/av/source/limits.h"
 
 namespace av {
@@ -11,6 +14,22 @@ namespace av {
 namespace {
 
 constexpr int mostThreads = 16;
+
+// A film may state any number where the libraries have an enumeration, and they hand it on.
+template <class Code>
+void keepKnown(Code& code, Code end, Code unspecified) {
+    std::uint32_t number = 0;
+    static_assert(sizeof code == sizeof number);
+    std::memcpy(&number, &code, sizeof number);
+    if (number >= static_cast<std::uint32_t>(end)) code = unspecified;
+}
+
+void keepKnownColours(AVFrame& picture) {
+    keepKnown(picture.color_range, AVCOL_RANGE_NB, AVCOL_RANGE_UNSPECIFIED);
+    keepKnown(picture.color_primaries, AVCOL_PRI_NB, AVCOL_PRI_UNSPECIFIED);
+    keepKnown(picture.color_trc, AVCOL_TRC_NB, AVCOL_TRC_UNSPECIFIED);
+    keepKnown(picture.colorspace, AVCOL_SPC_NB, AVCOL_SPC_UNSPECIFIED);
+}
 
 }  // namespace
 
@@ -38,8 +57,8 @@ bool DecodedPictures::openCodec(std::string& reason) {
         char tag[AV_FOURCC_MAX_STRING_SIZE] = {};
         const bool known = parameters.codec_id != AV_CODEC_ID_NONE;
         reason = std::string("there is no decoder for ") +
-                 (known ? avcodec_get_name(parameters.codec_id)
-                        : av_fourcc_make_string(tag, parameters.codec_tag));
+                 (known ? codecName(parameters.codec_id)
+                        : std::string(av_fourcc_make_string(tag, parameters.codec_tag)));
         return false;
     }
     codec_.reset(avcodec_alloc_context3(decoder));
@@ -54,7 +73,7 @@ bool DecodedPictures::openCodec(std::string& reason) {
     codec_->thread_count = std::clamp(threads_ > 0 ? threads_ : qv_platform().processors(), 1, mostThreads);
     codec_->thread_type = FF_THREAD_FRAME | FF_THREAD_SLICE;
     if (const int result = avcodec_open2(codec_.get(), decoder, nullptr); result < 0) {
-        reason = std::string("its ") + avcodec_get_name(parameters.codec_id) + " can't be decoded (" +
+        reason = std::string("its ") + codecName(parameters.codec_id) + " can't be decoded (" +
                  errorText(result) + ")";
         return false;
     }
@@ -121,6 +140,7 @@ DecodedPictures::Next DecodedPictures::next(AVFrame& picture) {
         const int result = avcodec_receive_frame(codec_.get(), &picture);
         if (result >= 0) {
             takeFields(picture);
+            keepKnownColours(picture);
             return Next::picture;
         }
         if (result == AVERROR_EOF) return Next::end;

@@ -314,7 +314,8 @@ void FrameReader::Decoding::describe(PictureFormat& format) {
     format.frames = plan_.frames;
     const AVRational aspect =
         av_guess_sample_aspect_ratio(&source_->container(), &source_->stream(), coming_.get());
-    if (aspect.num > 0 && aspect.den > 0) format.pixelAspect = av_q2d(aspect);
+    const double width = aspect.num > 0 && aspect.den > 0 ? av_q2d(aspect) : 0;
+    if (width <= limits::widestPixel && 1 <= width * limits::widestPixel) format.pixelAspect = width;
     format.fieldOrder = fieldOrderOf(first);
     format.colourMatrix = matrixOf(first);
     format.primaries = codePoint(first.color_primaries);

@@ -166,7 +166,7 @@ bool SampleReader::Decoding::openCodec(std::string& reason) {
     if (!decoder) {
         reason = parameters.codec_id == AV_CODEC_ID_NONE
                      ? std::string("the file does not say what it is")
-                     : std::string("there is no decoder for ") + avcodec_get_name(parameters.codec_id);
+                     : std::string("there is no decoder for ") + nameOf(parameters.codec_id);
         return false;
     }
     codec_.reset(avcodec_alloc_context3(decoder));
@@ -178,7 +178,7 @@ bool SampleReader::Decoding::openCodec(std::string& reason) {
     codec_->thread_count = 1;
     if (told_) codec_->flags2 |= AV_CODEC_FLAG2_SKIP_MANUAL;
     if (const int result = avcodec_open2(codec_.get(), decoder, nullptr); result < 0) {
-        reason = std::string("its ") + avcodec_get_name(parameters.codec_id) + " can't be decoded (" +
+        reason = std::string("its ") + nameOf(parameters.codec_id) + " can't be decoded (" +
                  errorText(result) + ")";
         return false;
     }

@@ -35,8 +35,18 @@ using PacketPtr = std::unique_ptr<AVPacket, Free>;
 using FramePtr = std::unique_ptr<AVFrame, Free>;
 using CodecPtr = std::unique_ptr<AVCodecContext, Free>;
 
+// A part of a sentence. The libraries' own texts for these speak of the libraries.
 inline std::string errorText(int code) {
-    if (code == -1) return "no reason is given";  // not the one of the system with that number
+    switch (code) {
+        case -1:  // not the one of the system with that number
+        case AVERROR_BUG:
+        case AVERROR_BUG2:
+        case AVERROR_EXTERNAL:
+        case AVERROR_UNKNOWN: return "no reason is given";
+        case AVERROR_PATCHWELCOME: return "this form of it is not supported";
+        case AVERROR_INVALIDDATA: return "its data are invalid";
+        default: break;
+    }
     char text[AV_ERROR_MAX_STRING_SIZE] = {};
     av_strerror(code, text, sizeof text);
     return text;

@@ -95,17 +95,21 @@ std::int64_t seekBytes(void* opaque, std::int64_t offset, int whence) {
     QvByteSource& source = *bytes.source;
     const long long size = source.size();
     const bool known = size != QvByteSource::unknown;
+    long long from = 0;
     switch (whence & ~AVSEEK_FORCE) {
         case AVSEEK_SIZE: return known ? size : AVERROR(ENOSYS);
         case SEEK_SET: break;
-        case SEEK_CUR: offset += bytes.left >= 0 ? bytes.left : source.position(); break;
+        case SEEK_CUR: from = bytes.left >= 0 ? bytes.left : source.position(); break;
         case SEEK_END:
             if (!known) return AVERROR(ENOSYS);
-            offset += size;
+            from = size;
             break;
         default: return AVERROR(EINVAL);
     }
-    if (bytes.left >= 0) return offset < 0 ? AVERROR(EINVAL) : bytes.left = offset;
+    if (offset > INT64_MAX - from) return AVERROR(EINVAL);
+    offset += from;
+    if (offset < 0) return AVERROR(EINVAL);
+    if (bytes.left >= 0) return bytes.left = offset;
     return source.seek(offset) ? offset : AVERROR(EIO);
 }
 
@@ -140,9 +144,13 @@ bool isEncrypted(const AVStream& stream) {
            av_stream_get_side_data(&stream, AV_PKT_DATA_ENCRYPTION_INIT_INFO, nullptr);
 }
 
-// Codecs whose packets the library can describe without their bytes.
+// Codecs whose packets the library can describe without their bytes. It takes captions and frames of DV with
+// sound apart as it reads them.
 bool isKnownByTable(const AVCodecParameters& codec) {
+    if (codec.codec_tag == MKTAG('v', 'd', 'v', 'a') || codec.codec_tag == MKTAG('d', 'v', 'c', 'a'))
+        return false;
     switch (codec.codec_id) {
+        case AV_CODEC_ID_EIA_608: return false;
         case AV_CODEC_ID_H264:
         case AV_CODEC_ID_HEVC:
         case AV_CODEC_ID_MPEG4:

@@ -48,8 +48,7 @@ CodecPtr openCodec(const AVStream& stream, std::string& reason) {
     int result = codec ? avcodec_parameters_to_context(codec.get(), stream.codecpar) : AVERROR(ENOMEM);
     if (codec) codec->pkt_timebase = stream.time_base;
     if (result >= 0) result = avcodec_open2(codec.get(), decoder, nullptr);
-    if (!decoder)
-        reason = std::string("there is no decoder for ") + avcodec_get_name(stream.codecpar->codec_id);
+    if (!decoder) reason = "there is no decoder for its subtitles";
     if (decoder && result < 0) reason = "its subtitles can't be decoded (" + errorText(result) + ")";
     return decoder && result >= 0 ? std::move(codec) : nullptr;
 }

@@ -39,6 +39,10 @@ class IndexOfFilms : public Films {
 
 TEST_F(IndexOfFilms, tablesGiveWhatAPassGivesWithoutTheBytes) {
     const std::string source = "testsrc2=size=320x240:rate=25:duration=8[out0];sine=duration=8[out1]";
+    std::string captions = "Scenarist_SCC V1.0\n\n";
+    for (int second = 0; second < 8; ++second)
+        captions += "00:00:0" + std::to_string(second) + ":10\t9420 9470 c8e5 ecec ef80 942c 942f\n\n";
+    folder.write("captions.scc", captions);
     const struct {
         const char* name;
         Words options;
@@ -48,6 +52,11 @@ TEST_F(IndexOfFilms, tablesGiveWhatAPassGivesWithoutTheBytes) {
         {"fast.mp4", {"-c:v", "mpeg4", "-b:v", "4M", "-c:a", "aac", "-movflags", "+faststart"}, true},
         {"pcm.mov", {"-c:v", "mjpeg", "-q:v", "3", "-c:a", "pcm_s16le", "-timecode", "01:00:00:00"}, true},
         {"mp3.mov", {"-c:v", "mpeg4", "-c:a", "mp3"}, false},
+        // A track of captions, whose packets the library takes apart.
+        {"captions.mov",
+         {"-i", folder.file("captions.scc"), "-map", "0:v", "-map", "1", "-c:v", "mpeg4", "-b:v", "4M",
+          "-c:s", "copy"},
+         false},
         {"parts.mp4", {"-c:v", "mpeg4", "-c:a", "aac", "-movflags", "+frag_keyframe+empty_moov"}, false},
         {"both.mp4", {"-c:v", "mpeg4", "-c:a", "aac", "-movflags", "+frag_keyframe"}, false},
         {"film.mkv", {"-c:v", "mpeg4", "-c:a", "aac"}, false},

@@ -167,6 +167,29 @@ TEST_F(FrameReaderOfFilms, aVariableRateBecomesAUsualOne) {
     EXPECT_EQ(reader->format().frames, 48);
 }
 
+TEST_F(FrameReaderOfFilms, whatNoFilmCanMeanIsTakenAsNotStated) {
+    std::string bytes = TempFolder::read(film("film.m2v", {"-c:v", "mpeg2video", "-color_primaries", "bt709",
+                                                           "-color_trc", "bt709", "-colorspace", "bt709"}));
+    const std::string colours("\1\1\1", 3), display("\0\0\1\xB5", 4);
+    std::size_t at = bytes.find(display);  // the extension of the sequence; the next one has the colours
+    for (at = bytes.find(display, at + 1); at != std::string::npos; at = bytes.find(display, at + 1))
+        if (bytes.compare(at + 5, 3, colours) == 0) bytes.replace(at + 5, 3, "\xC3\xFF\xFE");
+    folder.write("codes.m2v", bytes);
+    const auto codes = open(folder.file("codes.m2v"));
+    ASSERT_TRUE(codes);
+    for (const int number : {codes->format().primaries, codes->format().transfer, codes->format().space,
+                             codes->format().colourMatrix})
+        EXPECT_EQ(number, 0);
+    EXPECT_EQ(codes->read(), FrameReader::Read::picture);
+
+    for (const auto& [aspect, expected] : {std::pair{"1/2000000000", 1.0}, {"2/1", 2.0}, {"30000/1", 1.0}}) {
+        const auto reader = open(film(
+            "aspect.mov", {"-vf", std::string("setsar=") + aspect + ":max=2147483647", "-c:v", "mjpeg"}));
+        ASSERT_TRUE(reader);
+        EXPECT_EQ(reader->format().pixelAspect, expected) << aspect;
+    }
+}
+
 TEST_F(FrameReaderOfFilms, aHoleInTheFileIsCountedAndTheRestIsExact) {
     const std::string file = film("hole.mkv", {"-c:v", "mpeg2video", "-g", "1", "-q:v", "2"});
     const auto whole = open(file);
