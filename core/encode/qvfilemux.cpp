@@ -104,6 +104,15 @@ long long QvFileMuxStream::wholeBytes(std::string& problem) const {
 }
 
 long long QvFileMuxStream::length() const {
+    if (!parts.empty() && recorded) {
+        long long sum = 0;
+        for (const QvFilePart& part : parts) {
+            const long long bytes = QvFile::flength(part.file);
+            if (bytes < 0) return bytes;
+            sum += bytes;
+        }
+        return sum;
+    }
     if (!parts.empty()) return qvFilePartsBytes(parts);
     return textOf(file).empty() ? -1 : QvFile::flength(file);
 }

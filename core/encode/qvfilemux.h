@@ -32,8 +32,9 @@ struct QV_API QvFileMuxStream {
     Any file;      // the name of a regular file that is not empty
     // If there are any, the data are these, one after the other, and `file` is their name in messages.
     std::vector<QvFilePart> parts;
-    // Files that a multiplexer of this kind wrote with its parameter "record" at 1, each with a stream of
-    // this number within the type: pictures of one part begin where those of the part before it end.
+    // Files of the module that the attribute "recorder" of the multiplexer names, each with a stream of this
+    // number within the type: pictures of one part begin where those of the part before it end. `first` of a
+    // part is then the number of units at its beginning that are left out.
     bool recorded = false;
     Any codec;                   // name of the encoder that makes such data: "rawvenc"
     Any extension;               // without the dot; not set: the encoder's, else that of the file

@@ -104,6 +104,7 @@ void Job::begin(JobPlan plan) {
         if (parts_.stored && parts_.stored->isJoin())
             throw failure(Msg::splitJoin, {parts_.plan.output.name});
         options_.division->plan(parts_.plan);
+        for (std::string& line : options_.division->notes()) parts_.plan.notes.push_back(std::move(line));
     }
     const bool joins = parts_.stored && parts_.stored->isJoin();
     lengths_ = InputLengths(parts_.sources, joins ? parts_.stored->inputs() : std::vector<std::string>());

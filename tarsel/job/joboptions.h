@@ -50,6 +50,8 @@ class JobDivision {
     virtual int parts() const = 0;
     // Before any work. Throws Failure for a job that can't be divided.
     virtual void plan(const JobPlan& plan) = 0;
+    // Lines for the user: what of the result is not as in one piece.
+    virtual std::vector<std::string> notes() const = 0;
     // What --dry-run prints of it: lines.
     virtual std::string text() const = 0;
     // Frames or samples of each stream of the plan; nothing when it was stopped. Throws Failure.

@@ -89,7 +89,8 @@ class Multiplexed {
     void addRecorded(const PlannedStream& stream) {
         std::vector<QvFilePart> data;
         if (stream.isVideo())
-            for (const PartPictures& part : files_.pictures) data.push_back({Any(part.files.at(0).c_str())});
+            for (const PartPictures& part : files_.pictures)
+                data.push_back({Any(part.files.at(0).c_str()), part.lead});
         else
             data.push_back({Any(files_.sounds.at(0).c_str())});
         const std::string encoder = stream.encoder();

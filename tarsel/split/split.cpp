@@ -26,19 +26,13 @@ constexpr int kLeastParts = 2, kMostParts = 10000;
 constexpr double kSoundWeight = 0.03;  // of the sound, as a share of the picture's
 constexpr double kJoinWeight = 0.05;   // of putting the parts together, as a share of all
 
-// Whether a picture has the same bytes wherever its part begins.
-bool isCodedAlone(const std::string& encoder) {
-    const QvModule* const module = qv_registry()->module(encoder.c_str());
-    const auto is = [module](const char* trait) { return module && module->getAttr(trait).isTrue(); };
-    return encoder == "rawvenc" || is("onlyKeys") || is("uncompressed");
-}
-
 class Split : public JobDivision {
   public:
     Split(int parts, SplitPlace place) : wanted_(parts), place_(std::move(place)) {}
 
     int parts() const override { return wanted_; }
     void plan(const JobPlan& plan) override;
+    std::vector<std::string> notes() const override { return notes_; }
     std::string text() const override;
     std::vector<long long> run(const Given& given) override;
     void requestStop() override;
@@ -85,7 +79,9 @@ void Split::plan(const JobPlan& plan) {
     sound_ = plan.count(qvAudioStream) > 0;
     const auto picture = std::ranges::find_if(plan.streams, &PlannedStream::isVideo);
     rate_ = static_cast<double>(picture->picture.rate.rate());
-    differs_ = isFilm(plan) && !isCodedAlone(picture->encoder());
+    notes_.clear();
+    if (isFilm(plan) && !isCodedAlone(*picture))
+        notes_.push_back(lineOf(Msg::splitApart, {plan.output.name}));
 }
 
 std::string Split::text() const {
@@ -94,8 +90,6 @@ std::string Split::text() const {
         text += "part    " + std::to_string(part + 1) + ": frames " + std::to_string(split_.first(part)) +
                 " to " + std::to_string(split_.points[part + 1] - 1) + "\n";
     if (sound_) text += "part    " + std::to_string(split_.parts() + 1) + ": the sound\n";
-    if (differs_)
-        text += "        each part begins with a key frame, which the job in one piece may not have there\n";
     return text;
 }
 

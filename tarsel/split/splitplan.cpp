@@ -60,7 +60,8 @@ long long prerollOf(const PlannedStream& picture) {
     return frames;
 }
 
-// "" if there is none. Coded pictures that are only there to fill its memory can't be cut off again.
+// "" if there is none. Pictures that are only there to fill its memory can't be cut off where
+// others depend on them.
 std::string rememberingFilter(const PlannedStream& picture) {
     for (const Any& name : picture.filters.names(true))
         if (prerollOf(name.asString("")) > 0) return name.asString("");
@@ -83,6 +84,12 @@ std::string recorderOf(const JobPlan& plan) {
     return muxer ? muxer->getAttr("recorder").asString("") : "";
 }
 
+bool isCodedAlone(const PlannedStream& picture) {
+    const QvModule* const module = qv_registry()->module(picture.encoder().c_str());
+    const auto is = [module](const char* trait) { return module && module->getAttr(trait).isTrue(); };
+    return picture.encoder() == std::string_view("rawvenc") || is("onlyKeys") || is("uncompressed");
+}
+
 const PlannedStream& pictureOf(const JobPlan& plan) {
     return *std::ranges::find_if(plan.streams, &PlannedStream::isVideo);
 }
@@ -102,7 +109,8 @@ SplitPlan planSplit(const JobPlan& plan, int parts) {
     requireKind(plan);
     const PlannedStream& picture = pictureOf(plan);
     requireWholeFilters(plan, picture);
-    if (const std::string filter = isFilm(plan) ? rememberingFilter(picture) : ""; !filter.empty())
+    if (const std::string filter = isFilm(plan) && !isCodedAlone(picture) ? rememberingFilter(picture) : "";
+        !filter.empty())
         throw failure(Msg::splitFilter, {filter});
     const long long unit = splitUnit(plan), own = ownFrames(plan, picture);
     SplitPlan split;

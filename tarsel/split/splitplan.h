@@ -24,6 +24,9 @@ struct SplitPlan {
 std::string recorderOf(const JobPlan& plan);
 inline bool isFilm(const JobPlan& plan) { return !recorderOf(plan).empty(); }
 
+// Whether a picture has the same bytes wherever its part begins.
+bool isCodedAlone(const PlannedStream& picture);
+
 // The first one of a plan that has one.
 const PlannedStream& pictureOf(const JobPlan& plan);
 

@@ -203,6 +203,7 @@ constexpr Message kMessages[] = {
     {Msg::splitPictures,     Exit::usage, "--split",                               "{name} would get several pictures",                            "write one of them, or leave it out"},
     {Msg::splitJoin,         Exit::usage, "--split",                               "the job for {name} has several segments",                      "run each segment by itself, or leave it out"},
     {Msg::splitFilter,       Exit::usage, "--split",                               "the filter {text} works on what was in front of a part as well", "leave one of them out"},
+    {Msg::splitApart,        Exit::done,   "{file} is made in parts",              "each is coded by itself, so its bits are not those of one piece", ""},
     {Msg::splitPartKilled,   Exit::failed, "can't make {file}",                    "the process of part {text} was ended by signal {text}",               "see whether memory is short, or take fewer parts"},
     {Msg::splitPartFailed,   Exit::failed, "can't make {file}",                    "part {text} failed with status {text} and gave no reason",     "run the job without --split"},
     {Msg::splitPartLost,     Exit::failed, "can't make {file}",                    "part {text} was ended by the scheduler",                       "see whether it got enough time and memory"},

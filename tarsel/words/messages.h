@@ -203,6 +203,7 @@ enum class Msg : unsigned short {
     splitPictures,
     splitJoin,
     splitFilter,
+    splitApart,
     splitPartKilled,
     splitPartFailed,
     splitPartLost,

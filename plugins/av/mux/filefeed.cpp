@@ -97,6 +97,7 @@ class Feed {
     UnitLogEntry entry_;
     std::size_t file_ = 0;              // of them
     long long start_ = 0, frames_ = 0;  // pictures in front of that file and in it, as far as it was read
+    long long leftOut_ = 0;             // units at its beginning, still to come
     std::vector<UnitLogEntry> heads_;   // of the first file
     std::size_t head_ = 0;              // of this one
 
@@ -256,7 +257,8 @@ std::string Feed::stepRaw() {
 
 std::string Feed::openLog() {
     head_ = 0;
-    start_ += std::exchange(frames_, 0);
+    leftOut_ = stream_.parts.empty() ? 0 : stream_.parts[file_].first;
+    start_ += std::exchange(frames_, leftOut_) - leftOut_;
     return log_.open(stream_.parts.empty() ? stream_.file : stream_.parts[file_].file);
 }
 
@@ -270,6 +272,10 @@ std::string Feed::stepRecorded() {
     }
     read_ += static_cast<long long>(entry_.bytes.size());
     if (entry_.id == QvAuxId::VIDEO_STREAM_INFO || entry_.id == QvAuxId::AUDIO_STREAM_INFO) return sendHead();
+    if (leftOut_ > 0) {
+        if (entry_.id != 0) --leftOut_;
+        return "";
+    }
     if (std::string why = put(entry_.bytes.data(), entry_.bytes.size()); !why.empty()) return why;
     if (whole_ > 0 && !video()) next_ += static_cast<long long>(entry_.bytes.size()) / whole_;
     return entry_.id == 0 ? "" : sendUnit();
