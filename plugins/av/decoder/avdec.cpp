@@ -15,6 +15,8 @@
 #include "plugins/av/decoder/picturefiles.h"
 #include "plugins/av/index/packetindex.h"
 #include "plugins/av/source/avheaders.h"
+#include "plugins/av/source/boxes.h"
+#include "plugins/av/source/limits.h"
 
 namespace av {
 
@@ -143,6 +145,7 @@ int AvDec::openFilm() {
         fileSize_ = probe->size();
         if (!probe->seekable()) return refuse("it has to be sought, and a pipe can't be; put it into a file");
         extent_ = extentOf(*probe);
+        if (packetsOfTables(*probe) > limits::packets) return refuse(PacketIndex::tooMany);
     }
     const auto input = MediaInput::open(*bytes_, settings_.container, reason);
     if (!input) return refuse(reason);

@@ -2,7 +2,8 @@
 //
 // Frames and samples are counted before the first is read, from an index of the file's packets. Frame n and
 // sample n are the same after any seek as when the stream is read from its start. Streams are read and sought
-// independently: each has a demultiplexer of its own.
+// independently: each has a demultiplexer of its own. Where packets don't say when their pictures are
+// shown (H.264 and H.265 without a container) or how many samples they have, `open` decodes the stream once.
 //
 // Parameters: "source" (in the place of the file, see QvByteSource; it has to be sought), "threads" (stored;
 // of each stream's codec, 0: one a core), "upright" (stored; 1: frames are delivered as the film is to be

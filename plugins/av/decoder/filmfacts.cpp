@@ -1,12 +1,14 @@
 #include "plugins/av/decoder/filmfacts.h"
 
 #include <algorithm>
+#include <cstdlib>
 #include <cstring>
 #include <string>
 
 #include "core/measure/mediatime.h"
 #include "core/value/any.h"
 #include "plugins/av/source/avheaders.h"
+#include "plugins/av/source/limits.h"
 
 namespace av {
 
@@ -65,7 +67,7 @@ AnyVector chaptersOf(const AVFormatContext& container, const FilmZero& zero) {
         const AVChapter& chapter = *container.chapters[i];
         if (chapter.time_base.num < 1 || chapter.time_base.den < 1) continue;
         const std::int64_t time = av_rescale_q(chapter.start, chapter.time_base, unit);
-        if (time == INT64_MIN) continue;
+        if (std::max(std::llabs(time / 2), std::llabs(start / 2)) > limits::farthest) continue;
         AnyDict entry("time",
                       Any(MediaTime(std::max<std::int64_t>(time - start, 0), MediaTime::defaultTimescale)));
         if (const std::string title = text(chapter.metadata, "title"); !title.empty())

@@ -61,7 +61,7 @@ std::unique_ptr<PacketIndex> PacketIndex::build(MediaInput& input, std::string& 
         }
         av_packet_unref(packet.get());
         if (++count > limits::packets) {
-            reason = "it has more packets than can be indexed";
+            reason = tooMany;
             return nullptr;
         }
     }

@@ -28,6 +28,8 @@ static_assert(sizeof(IndexedPacket) <= 48, "aim: 64 bytes a packet with what its
 
 class PacketIndex {
   public:
+    static constexpr const char* tooMany = "it has more packets than can be indexed";  // a reason
+
     // Reads `input` from its start to its end, all streams, and rewinds it. What a damaged file has up to its
     // damage is kept: damage() says what happened. Null with `reason` when there is not even a packet, or
     // more than the limits allow.

@@ -366,7 +366,8 @@ bool FrameReader::describe(bool upright) {
     }
     decoding.writer = std::make_unique<FormWriter>(form, format_.width, format_.height);
     const AVRational base = decoding.source().stream().time_base;
-    zero_ = decoding.firstTime() * base.num;
+    const std::int64_t farthest = INT64_MAX / base.num;
+    zero_ = std::clamp(decoding.firstTime(), -farthest, farthest) * base.num;
     zeroBase_ = base.den;
     return true;
 }

@@ -40,7 +40,7 @@ bool isRate(Rational r) {
 Rational average(const std::vector<TimedPicture>& pictures, Rational base) {
     const auto count = static_cast<std::int64_t>(pictures.size()) - 1;
     const std::int64_t length = pictures.back().time - pictures.front().time;
-    if (count <= 0 || length <= 0) return {0, 1};
+    if (count <= 0 || length <= 0 || length > INT64_MAX / base.num) return {0, 1};
     // Times of more than 2^30 units can't all be exact to a unit of such a rate anyway.
     int num = 0, den = 1;
     av_reduce(&num, &den, count * base.den, length * base.num, 1 << 24);
@@ -99,14 +99,14 @@ std::int64_t presentation(const std::vector<IndexedPacket>& packets, std::size_t
         latest = packets[i].dts;
         if (packets[i].pts != packets[i].dts) return latest;
     }
-    return latest + duration;
+    return std::clamp(latest, -limits::farthest, limits::farthest) + duration;
 }
 
 }  // namespace
 
 std::vector<TimedPicture> presentedPictures(const std::vector<IndexedPacket>& packets,
                                             std::int64_t usualDuration, std::int64_t longestStep) {
-    constexpr std::int64_t most = 1LL << 60;
+    constexpr std::int64_t most = limits::farthest;
     std::vector<TimedPicture> pictures;
     pictures.reserve(packets.size());
     std::int64_t due = 0, expected = 0, shift = 0;
@@ -115,7 +115,8 @@ std::vector<TimedPicture> presentedPictures(const std::vector<IndexedPacket>& pa
         const std::int64_t duration = packet.duration > 0 ? packet.duration : usualDuration;
         if (packet.dts != AV_NOPTS_VALUE) {
             const std::int64_t decoded = std::clamp(packet.dts, -most, most);
-            if (i > 0 && std::llabs(decoded + shift - expected) > longestStep) shift = expected - decoded;
+            if (i > 0 && std::llabs(decoded + shift - expected) > longestStep)
+                shift = std::clamp(expected - decoded, -2 * most, 2 * most);
             expected = decoded + shift + duration;
         }
         std::int64_t time = packet.pts;

@@ -4,6 +4,7 @@
 #include <cstdlib>
 
 #include "plugins/av/source/avheaders.h"
+#include "plugins/av/source/limits.h"
 
 namespace av {
 
@@ -34,7 +35,10 @@ void SamplePlaces::set(std::span<const IndexedPacket> packets, std::span<const s
     // Containers of coarse or wavering clocks; what is longer is heard as a gap.
     const long long unit = av_rescale_q_rnd(1, base, sample, AV_ROUND_UP);
     const long long tolerance = std::max<long long>(clock.samplerate / 10, 2 * unit);
-    constexpr std::int64_t farthest = std::int64_t{1} << 60;
+    // A time of a hostile file may be beyond what can be added to.
+    const auto within = [](std::int64_t time) {
+        return std::clamp(time, -limits::farthest, limits::farthest);
+    };
     long long due = 0, shift = 0, end = 0;
     bool first = true;
     for (std::size_t i = 0; i < places_.size(); ++i) {
@@ -45,8 +49,7 @@ void SamplePlaces::set(std::span<const IndexedPacket> packets, std::span<const s
         long long at = due;
         if (packet.pts != AV_NOPTS_VALUE) {
             const long long before = priming.trim ? place.front : packet.skipAtStart;
-            at =
-                av_rescale_q(std::clamp(packet.pts, -farthest, farthest), base, sample) + before - clock.zero;
+            at = within(av_rescale_q(within(packet.pts), base, sample)) + before - within(clock.zero);
             if (first && !clock.hasZero) shift = -at;
             at += shift;
         }

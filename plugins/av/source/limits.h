@@ -19,7 +19,9 @@ inline constexpr int samplerate = 768'000;                           // Hz
 inline constexpr std::size_t allocation = std::size_t{1} << 30;      // one block of the libraries
 inline constexpr std::size_t packets = std::size_t{16} << 20;        // of a file
 inline constexpr std::size_t subtitleBytes = std::size_t{64} << 20;  // of a stream
-inline constexpr int frames = 0x3fffffff;                            // of a stream
+// Time on any clock, either way, whatever its unit is: sums of some of these fit into 64 bits.
+inline constexpr std::int64_t farthest = std::int64_t{1} << 60;
+inline constexpr int frames = 0x3fffffff;        // of a stream
 inline constexpr int variableFrames = 64 << 20;  // of a stream of variable rate, which needs a table
 
 }  // namespace av::limits

@@ -75,7 +75,8 @@ SubtitleReader::SubtitleReader(const MediaBytes& bytes, const std::string& forma
       index_(std::move(index)),
       num_(std::max(stream.time_base.num, 1)),
       den_(std::max(stream.time_base.den, 1)),
-      origin_(av_rescale(zero, timescale, std::max<std::int64_t>(zeroBase, 1))) {
+      origin_(std::clamp(av_rescale(zero, timescale, std::max<std::int64_t>(zeroBase, 1)), -limits::farthest,
+                         limits::farthest)) {
     const auto& packets = index_->packets(stream_);
     for (std::size_t i = 0; i < packets.size(); ++i) {
         const MediaTime end = endOf(i);
@@ -95,7 +96,8 @@ bool SubtitleReader::isEmpty(const IndexedPacket& packet) const {
 
 MediaTime SubtitleReader::time(std::int64_t pts) const {
     const std::int64_t ticks = av_rescale(pts, num_ * timescale, den_);
-    return MediaTime(ticks == INT64_MIN ? 0 : std::max<std::int64_t>(ticks - origin_, 0), timescale);
+    const std::int64_t known = ticks == INT64_MIN ? origin_ : std::min(ticks, limits::farthest);
+    return MediaTime(std::max<std::int64_t>(known - origin_, 0), timescale);
 }
 
 MediaTime SubtitleReader::endOf(std::size_t packet) const {

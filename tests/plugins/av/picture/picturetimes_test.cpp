@@ -98,4 +98,13 @@ TEST(PresentedPictures, comeInTheOrderOfTheirTimes) {
     for (const auto& c : cases) EXPECT_EQ(order(c.packets), c.order) << c.what;
 }
 
+// What the sanitizers see here is sums that do not fit.
+TEST(PicturePlan, timesAtTheEndsOfTheClockAreTaken) {
+    constexpr std::int64_t step = 1LL << 58;
+    std::vector<av::IndexedPacket> packets;
+    for (int cycle = 0; cycle < 9; ++cycle)
+        for (int i = -4; i <= 4; ++i) packets.push_back(packet(i * step, i * step));
+    EXPECT_EQ(order(packets, step).size(), packets.size());
+}
+
 }  // namespace

@@ -91,4 +91,19 @@ TEST(SamplePlaces, followTheTimesOfPacketsAndWhatTheySkip) {
     }
 }
 
+// What the sanitizers see here is sums that do not fit.
+TEST(SamplePlaces, timesAtTheEndsOfTheClockAreTaken) {
+    constexpr std::int64_t last = INT64_MAX, units = 1LL << 31;
+    std::vector<av::IndexedPacket> packets;
+    for (const std::int64_t pts : {-last, last, 0L, -last, last})
+        packets.push_back({pts, none, -1, 10, 0, 0, 0});
+    const std::vector<std::uint32_t> counts(packets.size(), 10);
+    for (const bool hasZero : {false, true})
+        for (const std::int64_t zero : {-last - 1, last}) {
+            av::SamplePlaces places;
+            places.set(packets, counts, {true, 1, 0}, {units - 1, 1, 48000, hasZero, hasZero ? zero : 0});
+            EXPECT_GE(places.samples(), 0);
+        }
+}
+
 }  // namespace
