@@ -63,7 +63,7 @@ class Split : public JobDivision {
     const SlurmScheduler slurm_;
     SplitPlan split_;
     bool sound_ = false;
-    bool differs_ = false;     // the bits, from those of the job in one piece
+    std::vector<std::string> notes_;
     std::vector<Part> parts_;  // those of the picture, then the sound
     std::unique_ptr<PartExecutor> executor_;
     std::mutex lock_;  // of executor_, which signals and keys reach as well
