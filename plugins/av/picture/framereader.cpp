@@ -294,6 +294,13 @@ FrameReader::Read FrameReader::Decoding::show(std::size_t wanted, std::string& f
     if (heldNumber_ == wanted) return Read::picture;
     for (int dropped = 0;;) {
         if (const Read result = advance(wanted, dropped, failure); result != Read::end) return result;
+        if (startedAt_ > 0 && !counted_[wanted] && startFor(wanted) == startedAt_) {
+            // It may be lost because decoding began at that key, and not from a key before it.
+            dropStart(dropped);
+            heldNumber_.reset();
+            comingNumber_.reset();
+            continue;
+        }
         conceal(wanted);
         if (heldNumber_) return Read::picture;
         if (startedAt_ == 0) break;
