@@ -8,7 +8,7 @@ namespace {
 
 std::string number(std::uint64_t value, int bytes) {
     std::string text;
-    while (bytes-- > 0) text += static_cast<char>(value >> 8 * bytes);
+    while (bytes-- > 0) text += bytes < 8 ? static_cast<char>(value >> 8 * bytes) : '\0';
     return text;
 }
 
