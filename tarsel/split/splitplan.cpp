@@ -36,7 +36,12 @@ void requireKind(const JobPlan& plan) {
     const OutputForm& output = plan.output;
     const bool kind = output.kind == OutputKind::raw || output.kind == OutputKind::pictures ||
                       output.kind == OutputKind::avi || isFilm(plan);
-    if (!output.isFiles() || !kind) throw failure(Msg::splitOutput, {output.name});
+    // Sound that no encoder makes is a part of what its multiplexer writes.
+    const auto isBare = [](const PlannedStream& stream) {
+        return stream.encoder() == std::string_view("dummyaenc");
+    };
+    if (!output.isFiles() || !kind || std::ranges::any_of(plan.streams, isBare))
+        throw failure(Msg::splitOutput, {output.name});
     if (plan.count(qvVideoStream) != 1) throw failure(Msg::splitPictures, {output.name});
 }
 

@@ -170,6 +170,8 @@ TEST_F(SplitJob, WhatCanNotBeDividedIsRefused) {
              {{"-o", "a.avi", "--cut", "0-0.2", "--cut", "0.4-0.6", "--split", "2"},
               {"'a.avi'", "several segments"}},
              {{"-o", "/dev/null", "--format", "i420", "--no-audio", "--split", "2"}, {"--split"}}});
+    fails(2, {"transcode", "testgen:size=720x576,rate=25i,duration=1", "-o", "a.dv", "--split", "2"},
+          {"'a.dv'"});
     fails(2,
           {"transcode", "testgen:size=64x48,rate=25i,duration=1", "-o", "a.mp4", "--deinterlace=double",
            "--split", "2"},

@@ -155,7 +155,7 @@ TEST_F(Task, AnInputThatLacksAStreamIsNamed) {
     const std::string address = "first=\"2\" second=\"0\"";
     task.replace(task.find(address), address.size(), "first=\"2\" second=\"4\"");
     folder.write("job.xml", task);
-    fails(3, {"run", "job.xml"}, {"'job.xml' is no sound task", "it takes audio stream 4 of"});
+    fails(3, {"run", "job.xml"}, {"'job.xml' is not a valid task", "it takes audio stream 4 of"});
 }
 
 TEST_F(Task, DamagedTasksAreRefusedByName) {
@@ -167,18 +167,18 @@ TEST_F(Task, DamagedTasksAreRefusedByName) {
     none.replace(none.find("rawaenc"), 7, "nowhere");
     folder.write("none.xml", none);
     for (const Words& command : {Words{"run"}, Words{"task", "show"}, Words{"task", "check"}}) {
-        fails(3, command + Words{"cut.xml"}, {"'cut.xml' is no sound task"});
+        fails(3, command + Words{"cut.xml"}, {"'cut.xml' is not a valid task"});
         fails(3, command + Words{"empty.xml"}, {"'empty.xml'"});
-        fails(3, command + Words{"none.xml"}, {"'none.xml' is no sound task", "nowhere"});
+        fails(3, command + Words{"none.xml"}, {"'none.xml' is not a valid task", "nowhere"});
         fails(3, command + Words{"absent.xml"}, {"'absent.xml'", "no such file"});
-        fails(3, command + Words{"in.wav"}, {"'in.wav' is no sound task"});
+        fails(3, command + Words{"in.wav"}, {"'in.wav' is not a valid task"});
     }
     std::string other = task;
     const std::string stream = "<pair first=\"2\" second=\"0\"/>";
     ASSERT_NE(other.find(stream), std::string::npos);
     other.replace(other.find(stream), stream.size(), "<pair first=\"2\" second=\"7\"/>");
     folder.write("other.xml", other);
-    fails(3, {"run", "other.xml", "-y"}, {"'other.xml' is no sound task", "audio stream 7 of", "not there;"});
+    fails(3, {"run", "other.xml", "-y"}, {"'other.xml' is not a valid task", "audio stream 7 of", "not there;"});
     fails(2, {"task", "shwo", "job.xml"}, {"'shwo'", "did you mean 'show'?"});
     fails(2, {"task", "show", "job.xml", "job.xml"}, {"one task file"});
 }

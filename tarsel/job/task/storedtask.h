@@ -70,7 +70,7 @@ class StoredTask {
     std::unique_ptr<QvTask> task_;
 };
 
-// Throws Failure if a file is no sound task.
+// Throws Failure if a file is not a valid task.
 void requireTask(const std::string& file);
 
 // Writes a state as a task file. Returns why it could not, as the end of a sentence; "" when it is written.
