@@ -24,5 +24,6 @@ struct SnapshotTasks {
     std::vector<BatchTask> makers;  // of its inputs
 };
 
-// Throws Failure (usage) for a word that is none, and Failure (input) if the file does not hold what it says.
+// Throws Failure (usage) for a word of another form, and Failure (input) if the file does not hold what it
+// says.
 SnapshotTasks readSnapshot(const BatchFile& list, const std::string& file, const std::string& word);

@@ -83,7 +83,7 @@ void removeTasks(const BatchFile& file, const Words& words) {
         for (auto i = indexes.rbegin(); i != indexes.rend(); ++i) {
             const std::string name = file.journal(taskAt(file, list, *i).id);
             list.remove(static_cast<int>(*i));
-            // What was done with a task is of no use without it.
+            // What was done with a task means nothing without the task.
             if (!RecordFile::isLocked(name)) removeFile(name);
         }
     });

@@ -239,7 +239,7 @@ std::shared_ptr<JobDivision> makeSplit(const std::string& parts, const SplitPlac
     return std::make_shared<Split>(count, place);
 }
 
-// A number that is none comes from another program, whose task can be made in one piece.
+// Another program may have written any number; without a division the task is made in one piece.
 std::shared_ptr<JobDivision> storedSplit(const StoredTask& task) {
     const int parts = task.raw().getInt32(kSplitKey, 0);
     return parts >= kLeastParts && parts <= kMostParts ? std::make_shared<Split>(parts, SplitPlace())

@@ -15,7 +15,7 @@ struct SplitPlace {
 };
 
 // A division of a job into so many parts, for JobOptions::division; null for "". Throws Failure (usage) for a
-// number that is none, or below 2, and for a place without parts.
+// text that is no whole number from 2 on, and for a place without parts.
 std::shared_ptr<JobDivision> makeSplit(const std::string& parts, const SplitPlace& place = {});
 // The one that a task asks for; null for none.
 std::shared_ptr<JobDivision> storedSplit(const StoredTask& task);

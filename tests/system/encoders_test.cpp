@@ -152,7 +152,7 @@ TEST_F(Encoders, AreKeptByAPresetOfOnesOwn) {
         EXPECT_THAT(run(Words{"presets", "save", "X"} + row.options).err, HasSubstr(row.part));
 }
 
-// A container goes to a pipe whole, and is told that nobody can go back there.
+// A container for a pipe is written from front to end, without going back.
 TEST_F(Encoders, WriteContainersToPipes) {
     const Outcome o = works(job({"-o", "-", "--format", "mkv"}));
     EXPECT_THAT(o.out, StartsWith("mkvmux seekable 0\n"));

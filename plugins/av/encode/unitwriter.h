@@ -11,7 +11,8 @@ class QvBufStream;
 
 namespace av {
 
-// Takes the stream's lock for each call. What fails is told by problem(); the stream is then of no more use.
+// Takes the lock of the stream for each call. After a failure, which problem() describes, the stream takes
+// nothing more.
 class UnitWriter {
   public:
     UnitWriter() = default;

@@ -85,7 +85,7 @@ class Multiplexer : public BaseMuxer {
     QvBufStream* streamAt(int type, int number) const;
 };
 
-// A new multiplexer, owned by the caller; null for a module that is none.
+// A new multiplexer, owned by the caller; null where no multiplexer has that name.
 QvCodec* newMultiplexer(const char* module);
 
 }  // namespace av

@@ -280,7 +280,7 @@ TEST_F(Batch, AStoppedRunStopsItsTasks) {
     EXPECT_EQ(stateOf(task), '-');
 }
 
-// The run itself goes on, so that its keys work; the tasks are what stands still.
+// The run itself goes on, so that its keys work; only the tasks pause.
 TEST_F(Batch, KeysPauseTheTasks) {
     add(endless("long.raw"));
     ProcessOptions screen = here();
