@@ -168,7 +168,8 @@ TEST_F(Command, ATaskFileHoldsTheJob) {
                                                   folder.file("out.wav") + "' by rawmux\n");
     folder.write("bad.xml",
                  task.substr(0, task.find("<i32>")) + "<i32>x" + task.substr(task.find("<i32>") + 6));
-    fails(3, {"info", "bad.xml"}, {"'bad.xml' is not a valid task: line 7, encoder/", "it is no whole number"});
+    fails(3, {"info", "bad.xml"},
+          {"'bad.xml' is not a valid task: line 7, encoder/", "it is no whole number"});
     // A name that its format does not end is kept where there is one file.
     works({"transcode", "in.wav", "-o", "clip", "--format", "wav", "--dry-run", "--save-task", "named.xml"});
     EXPECT_THAT(contents("named.xml"), HasSubstr("<key>exactName</key>"));

@@ -178,7 +178,8 @@ TEST_F(Task, DamagedTasksAreRefusedByName) {
     ASSERT_NE(other.find(stream), std::string::npos);
     other.replace(other.find(stream), stream.size(), "<pair first=\"2\" second=\"7\"/>");
     folder.write("other.xml", other);
-    fails(3, {"run", "other.xml", "-y"}, {"'other.xml' is not a valid task", "audio stream 7 of", "not there;"});
+    fails(3, {"run", "other.xml", "-y"},
+          {"'other.xml' is not a valid task", "audio stream 7 of", "not there;"});
     fails(2, {"task", "shwo", "job.xml"}, {"'shwo'", "did you mean 'show'?"});
     fails(2, {"task", "show", "job.xml", "job.xml"}, {"one task file"});
 }
