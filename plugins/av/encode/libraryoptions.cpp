@@ -5,6 +5,8 @@
 #include <string_view>
 #include <vector>
 
+#include "plugins/av/source/optionlist.h"
+
 namespace av {
 
 namespace {
@@ -38,60 +40,29 @@ bool isOwned(std::string_view name, std::string_view value) {
            (isParameters(name) && contains(ownedThere, value));
 }
 
-int distance(std::string_view a, std::string_view b) {
-    std::vector<int> row(b.size() + 1);
-    for (std::size_t j = 0; j <= b.size(); ++j) row[j] = static_cast<int>(j);
-    for (std::size_t i = 1; i <= a.size(); ++i) {
-        int diagonal = row[0];
-        row[0] = static_cast<int>(i);
-        for (std::size_t j = 1; j <= b.size(); ++j) {
-            const int change = diagonal + (a[i - 1] == b[j - 1] ? 0 : 1);
-            diagonal = row[j];
-            row[j] = std::min({row[j] + 1, row[j - 1] + 1, change});
-        }
-    }
-    return row.back();
+std::string unknown(const AVCodecContext& context, const std::string& name) {
+    const std::string near = similarNames(
+        name, writingOptions({context.av_class, context.codec ? context.codec->priv_class : nullptr}));
+    return "there is no option '" + name + "'" + (near.empty() ? "" : "; do you mean " + near + "?");
 }
 
-void collectNear(const void* object, std::string_view name, std::vector<std::string>& near) {
-    const AVOption* option = nullptr;
-    while (object && (option = av_opt_next(object, option)))
-        if (option->type != AV_OPT_TYPE_CONST && (option->flags & AV_OPT_FLAG_ENCODING_PARAM) &&
-            distance(option->name, name) <= 2)
-            near.emplace_back(option->name);
+int put(AVCodecContext& context, const char* name, const char* value) {
+    return checked(av_opt_set(&context, name, value, AV_OPT_SEARCH_CHILDREN));
 }
-
-std::string unknown(AVCodecContext& context, const std::string& name) {
-    std::vector<std::string> near;
-    if (name.size() < 64) {
-        collectNear(&context, name, near);
-        if (context.codec && context.codec->priv_class) collectNear(context.priv_data, name, near);
-    }
-    std::string text = "there is no option '" + name + "'";
-    for (std::size_t i = 0; i < near.size() && i < 3; ++i)
-        text += (i == 0 ? "; do you mean '" : "', '") + near[i];
-    return near.empty() ? text : text + "'?";
-}
-
-struct FreeDictionary {
-    AVDictionary* all = nullptr;
-    ~FreeDictionary() { av_dict_free(&all); }
-};
 
 }  // namespace
 
 std::string setOptions(AVCodecContext& context, const std::string& options) {
     if (options.empty()) return "";
-    FreeDictionary given;
-    if (av_dict_parse_string(&given.all, options.c_str(), "=", ":", 0) < 0)
-        return "'" + options + "' is not of the form name=value:name=value";
+    OptionList given;
+    if (!given.parse(options)) return "'" + options + "' is not of the form name=value:name=value";
     const AVDictionaryEntry* entry = nullptr;
-    while ((entry = av_dict_get(given.all, "", entry, AV_DICT_IGNORE_SUFFIX))) {
+    while ((entry = given.next(entry))) {
         if (namesFile(entry->key, entry->value))
             return std::string("option '") + entry->key + "' names a file, which is not allowed";
         const int flags = context.flags & ownedFlags;
         const bool refused = isOwned(entry->key, entry->value);
-        const int set = refused ? 0 : av_opt_set(&context, entry->key, entry->value, AV_OPT_SEARCH_CHILDREN);
+        const int set = refused ? 0 : put(context, entry->key, entry->value);
         if (refused || (context.flags & ownedFlags) != flags)
             return std::string("option '") + entry->key + "=" + entry->value +
                    "' is what the encoder's own parameters decide";
@@ -101,11 +72,15 @@ std::string setOptions(AVCodecContext& context, const std::string& options) {
     return "";
 }
 
+bool setOption(AVCodecContext& context, const char* name, const std::string& value) {
+    return put(context, name, value.c_str()) >= 0;
+}
+
 bool addParameters(AVCodecContext& context, const char* name, const std::string& parameters) {
-    FreeDictionary all;
-    return av_opt_get_dict_val(&context, name, AV_OPT_SEARCH_CHILDREN, &all.all) >= 0 &&
-           av_dict_parse_string(&all.all, parameters.c_str(), "=", ":", 0) >= 0 &&
-           av_opt_set_dict_val(&context, name, all.all, AV_OPT_SEARCH_CHILDREN) >= 0;
+    OptionList all;
+    return checked(av_opt_get_dict_val(&context, name, AV_OPT_SEARCH_CHILDREN, all.raw())) >= 0 &&
+           all.parse(parameters) &&
+           checked(av_opt_set_dict_val(&context, name, *all.raw(), AV_OPT_SEARCH_CHILDREN)) >= 0;
 }
 
 std::string checkOptions(const AVCodec& codec, const std::string& options) {

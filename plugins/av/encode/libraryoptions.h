@@ -11,7 +11,10 @@ namespace av {
 // files are refused: a task that somebody sends must not write any. Refused, too, is what the encoder's
 // parameters decide, as rates, channels, threads and passes: buffers are made for these.
 std::string setOptions(AVCodecContext& context, const std::string& options);
-// Adds "name=value:name=value" to what the option `name` has already. False without memory.
+// One option of the encoder or its library, which does not come from a user. False if there is no such option
+// or value. Throws std::bad_alloc.
+bool setOption(AVCodecContext& context, const char* name, const std::string& value);
+// Adds "name=value:name=value" to what the option `name` has already. Throws std::bad_alloc.
 bool addParameters(AVCodecContext& context, const char* name, const std::string& parameters);
 // setOptions on a context of its own.
 std::string checkOptions(const AVCodec& codec, const std::string& options);

@@ -508,8 +508,10 @@ int SoundEnc::close() {
     if (context_ && (filled_ > 0 || taken_ > 0)) {
         if (filled_ > 0) result = sendFrame();
         if (result == QvStatus::ok) {
-            avcodec_send_frame(context_.get(), nullptr);
-            result = drain();
+            const int ended = avcodec_send_frame(context_.get(), nullptr);
+            result = ended < 0
+                         ? setError(QvStatus::failed, "The encoder failed (%s)", errorText(ended).c_str())
+                         : drain();
         }
         if (result == QvStatus::ok && !sendHead(true))
             result = setError(QvStatus::failed, "%s", output_.problem().c_str());

@@ -227,8 +227,7 @@ std::string VideoEnc::describeCodec() {
     const VideoSettings& s = settings_;
     AVCodecContext& c = *context_;
     const auto set = [&c](const char* name, const std::string& value) {
-        if (value.empty() || !*name) return true;
-        return av_opt_set(&c, name, value.c_str(), AV_OPT_SEARCH_CHILDREN) >= 0;
+        return value.empty() || !*name || setOption(c, name, value);
     };
     if (!set(s.codec->preset, s.preset)) return "There is no preset '" + s.preset + "'";
     if (!set(s.codec->tune, s.tune)) return "There is no tune '" + s.tune + "'";
@@ -261,19 +260,19 @@ std::string VideoEnc::configureRate() {
         if (c.gop_size == 1)
             c.gop_size = s.codec->has(VideoTrait::setsFirst) && s.codec->has(VideoTrait::statsFile) ? 1 : 0;
         if (s.n > 1 && s.codec->has(VideoTrait::statsText)) c.flags |= AV_CODEC_FLAG_CLOSED_GOP;
-        if (s.m > 1 && is(*s.codec, "h264venc")) av_opt_set(&c, "forced-idr", "1", AV_OPT_SEARCH_CHILDREN);
+        if (s.m > 1 && is(*s.codec, "h264venc")) setOption(c, "forced-idr", "1");
     }
     if (!s.timecode.empty() && is(*s.codec, "mpegvenc")) {
         std::string timecode = s.timecode;
         // The library drops numbers at this rate only.
         if (c.framerate.num != 30000) std::replace(timecode.begin(), timecode.end(), ';', ':');
-        av_opt_set(&c, "gop_timecode", timecode.c_str(), AV_OPT_SEARCH_CHILDREN);
+        setOption(c, "gop_timecode", timecode);
     }
     // Which of the tables of DNxHD it is: that of its highest quality.
     if (s.codesFields() && is(*s.codec, "vc3venc")) c.bit_rate = s.rate.rate().ratio() > 26 ? 220e6 : 185e6;
     if (!s.codec->has(VideoTrait::rated)) return "";
     if (s.byQuality()) {
-        av_opt_set(&c, s.codec->quality, std::to_string(s.quality).c_str(), AV_OPT_SEARCH_CHILDREN);
+        setOption(c, s.codec->quality, std::to_string(s.quality));
         return "";
     }
     const double target = s.target > 0 ? s.target : s.codec->usualBits;
@@ -316,7 +315,7 @@ std::string VideoEnc::configurePass() {
             if (!s.firstPass && !files_.restore(*s.passes)) return "There are no statistics of a first pass";
             if (x265)
                 own += ":pass=" + std::to_string(s.firstPass ? 1 : 2) + ":stats=" + name;
-            else if (av_opt_set(&c, "stats", name.c_str(), AV_OPT_SEARCH_CHILDREN) < 0)
+            else if (!setOption(c, "stats", name))
                 return "Out of memory";
         } else if (!s.firstPass) {
             if (!loadPass(*s.passes, 0, statistics_)) return "There are no statistics of a first pass";
@@ -325,7 +324,7 @@ std::string VideoEnc::configurePass() {
     } else if (s.firstPass) {
         return "There is no record for the statistics of a first pass";
     }
-    if (x265 && !addParameters(c, "x265-params", own)) return "Out of memory";
+    if (x265 && !addParameters(c, "x265-params", own)) return "The parameters of the codec can't be set";
     return "";
 }
 
@@ -441,8 +440,9 @@ int VideoEnc::close() {
     int result = QvStatus::ok;
     // An encoder that never had a picture has nothing that is late.
     if (frames_ > 0) {
-        avcodec_send_frame(context_.get(), nullptr);
-        result = drain();
+        const int ended = avcodec_send_frame(context_.get(), nullptr);
+        result = ended < 0 ? setError(QvStatus::failed, "The encoder failed (%s)", errorText(ended).c_str())
+                           : drain();
         if (result == QvStatus::ok && !settings_.firstPass && units_ != frames_)
             result = setError(QvStatus::failed, "The encoder wrote %lld of %lld pictures", units_, frames_);
         if (result == QvStatus::ok && settings_.firstPass) result = finishPass();

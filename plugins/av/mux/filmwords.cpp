@@ -4,10 +4,11 @@
 #include <cmath>
 #include <cstdlib>
 #include <cstring>
+#include <new>
 #include <vector>
 
 #include "core/measure/mediatime.h"
-#include "plugins/av/source/avheaders.h"
+#include "plugins/av/source/optionlist.h"
 
 namespace av {
 
@@ -69,11 +70,11 @@ bool setChapters(AVFormatContext& film, const AnyVector& chapters, double second
     }
     std::sort(starts.begin(), starts.end());
     auto** const list = static_cast<AVChapter**>(av_calloc(starts.size(), sizeof(AVChapter*)));
-    if (!list) return starts.empty();
+    if (!list) throw std::bad_alloc();
     film.chapters = list;
     for (std::size_t i = 0; i < starts.size(); ++i) {
         auto* const chapter = static_cast<AVChapter*>(av_mallocz(sizeof(AVChapter)));
-        if (!chapter) return false;
+        if (!chapter) throw std::bad_alloc();
         list[film.nb_chapters++] = chapter;
         chapter->id = static_cast<std::int64_t>(i) + 1;
         chapter->time_base = milliseconds;
@@ -81,7 +82,7 @@ bool setChapters(AVFormatContext& film, const AnyVector& chapters, double second
         chapter->end = i + 1 < starts.size()
                            ? starts[i + 1].first
                            : std::max<std::int64_t>(std::llround((seconds + start) * 1000), chapter->start);
-        if (!starts[i].second.empty()) av_dict_set(&chapter->metadata, "title", starts[i].second.c_str(), 0);
+        if (!starts[i].second.empty()) setEntry(chapter->metadata, "title", starts[i].second);
     }
     return true;
 }
@@ -96,10 +97,10 @@ void setTimecode(AVFormatContext& film, std::string timecode) {
     for (unsigned i = 0; i < film.nb_streams; ++i)
         if (film.streams[i]->codecpar->codec_type == AVMEDIA_TYPE_VIDEO && !dropsNumbers(*film.streams[i]))
             std::replace(timecode.begin(), timecode.end(), ';', ':');
-    av_dict_set(&film.metadata, "timecode", timecode.c_str(), 0);
+    setEntry(film.metadata, "timecode", timecode);
     for (unsigned i = 0; i < film.nb_streams; ++i)
         if (film.streams[i]->codecpar->codec_type == AVMEDIA_TYPE_VIDEO) {
-            av_dict_set(&film.streams[i]->metadata, "timecode", timecode.c_str(), 0);
+            setEntry(film.streams[i]->metadata, "timecode", timecode);
             break;
         }
 }
@@ -111,7 +112,7 @@ void setTag(AVFormatContext& film, const Container& container, const char* tag, 
                             : format == "mpegts" ? "service_name"
                             : format == "mxf"    ? "material_package_name"
                                                  : tag;
-    av_dict_set(&film.metadata, own, text.c_str(), 0);
+    setEntry(film.metadata, own, text);
 }
 
 }  // namespace

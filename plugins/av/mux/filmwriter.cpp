@@ -162,10 +162,9 @@ bool FilmWriter::begin() {
     std::string lost = setFilmWords(*made, *job_.container, job_.meta, seconds(), startTime());
     if (losesFields()) lost += (lost.empty() ? "" : ", ") + std::string("the order of its fields");
     if (!lost.empty()) qv_log()->warning("'%s' does not hold: %s", job_.name.c_str(), lost.c_str());
-    AVDictionary* options = nullptr;
-    setOptions(&options);
-    result = avformat_write_header(made, &options);
-    av_dict_free(&options);
+    OptionList options;
+    setOptions(options);
+    result = avformat_write_header(made, options.raw());
     if (result < 0) return failWith("it can't be begun with these streams", result);
     begun_ = true;
     bool ok = true;
@@ -190,9 +189,9 @@ bool FilmWriter::addStream(MuxTrack& track) {
                        })->place() == track.place();
     if (first) stream->disposition |= AV_DISPOSITION_DEFAULT;
     if (!track.language.empty() && (job_.container->words & FilmWord::language))
-        av_dict_set(&stream->metadata, "language", languageFor(job_.format, track.language).c_str(), 0);
+        setEntry(stream->metadata, "language", languageFor(job_.format, track.language));
     if (!track.title.empty() && (job_.container->words & FilmWord::commonTags))
-        av_dict_set(&stream->metadata, "title", track.title.c_str(), 0);
+        setEntry(stream->metadata, "title", track.title);
     return true;
 }
 
@@ -233,7 +232,7 @@ long long FilmWriter::indexBytes() const {
     return bytes;
 }
 
-void FilmWriter::setOptions(AVDictionary** options) {
+void FilmWriter::setOptions(OptionList& options) {
     const Container& container = *job_.container;
     if (container.is(MuxTrait::indexInFront)) {
         const bool pipe = !job_.seekable;
@@ -241,36 +240,34 @@ void FilmWriter::setOptions(AVDictionary** options) {
         const char* const flags = pipe ? "+write_colr+frag_keyframe+delay_moov+default_base_moof"
                                   : makesFragments(job_.options) ? "+write_colr+delay_moov+default_base_moof"
                                                                  : "+write_colr";
-        av_dict_set(options, "movflags", flags, 0);
+        options.set("movflags", flags);
         if (pipe) {
-            av_dict_set(options, "min_frag_duration", "1000000", 0);
-            av_dict_set(options, "frag_duration", "10000000", 0);
+            options.set("min_frag_duration", "1000000");
+            options.set("frag_duration", "10000000");
         } else if (job_.fastStart && job_.frames > 0 && indexBytes() < INT_MAX &&
                    !makesFragments(job_.options)) {
-            av_dict_set_int(options, "moov_size", indexBytes(), 0);
+            options.set("moov_size", std::to_string(indexBytes()));
             spaceKept_ = true;
         }
-        if (av_dict_get(film_->metadata, "timecode", nullptr, 0)) av_dict_set(options, "write_tmcd", "1", 0);
+        if (av_dict_get(film_->metadata, "timecode", nullptr, 0)) options.set("write_tmcd", "1");
     }
-    if (!job_.seekable && container.pipe == PipeForm::live) av_dict_set(options, "live", "1", 0);
+    if (!job_.seekable && container.pipe == PipeForm::live) options.set("live", "1");
     // Packets with a time before each are those of disks, which have no other sound.
     const bool disk = std::none_of(tracks_.begin(), tracks_.end(), [](const MuxTrack& track) {
         return !track.video() && track.codec().codec != MuxCodec::ac3 &&
                track.codec().codec != MuxCodec::eac3;
     });
-    if (disk && (job_.extension == "m2ts" || job_.extension == "mts"))
-        av_dict_set(options, "mpegts_m2ts_mode", "1", 0);
-    AVDictionary* own = nullptr;
-    parseMuxOptions(job_.options, job_.format, &own);
+    if (disk && (job_.extension == "m2ts" || job_.extension == "mts")) options.set("mpegts_m2ts_mode", "1");
+    OptionList own;
+    parseMuxOptions(job_.options, job_.format, own);
     const AVDictionaryEntry* entry = nullptr;
-    while ((entry = av_dict_get(own, "", entry, AV_DICT_IGNORE_SUFFIX))) {
+    while ((entry = own.next(entry))) {
         // Flags come on top of those that the film needs.
         const bool flags = std::strcmp(entry->key, "movflags") == 0;
         const bool listed = *entry->value == '+' || *entry->value == '-';
         const std::string value = (flags && !listed ? "+" : "") + std::string(entry->value);
-        av_dict_set(options, entry->key, value.c_str(), flags || *entry->value == '+' ? AV_DICT_APPEND : 0);
+        options.set(entry->key, value, flags || *entry->value == '+' ? AV_DICT_APPEND : 0);
     }
-    av_dict_free(&own);
 }
 
 // --- The end.

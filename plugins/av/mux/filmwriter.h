@@ -11,6 +11,7 @@
 #include "core/value/anycontainer.h"
 #include "plugins/av/mux/muxtrack.h"
 #include "plugins/av/mux/sinkbytes.h"
+#include "plugins/av/source/optionlist.h"
 
 class QvBufStream;
 
@@ -84,7 +85,7 @@ class FilmWriter {
     bool losesFields() const;
     bool begin();
     bool addStream(MuxTrack& track);
-    void setOptions(AVDictionary** options);
+    void setOptions(OptionList& options);
     long long indexBytes() const;
     double seconds() const;
     double startTime() const;

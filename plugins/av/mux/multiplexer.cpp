@@ -140,7 +140,8 @@ int Multiplexer::checkOptions(const Any& value) {
     const std::string text = textOf(value);
     if (value.isValid() && !value.isText())
         return setError(QvStatus::invalidParam, "'avOptions' takes a text");
-    const std::string problem = parseMuxOptions(text, formFor(container_, extension()).format, nullptr);
+    OptionList unused;
+    const std::string problem = parseMuxOptions(text, formFor(container_, extension()).format, unused);
     if (!problem.empty()) return setError(QvStatus::invalidParam, "avOptions: %s", problem.c_str());
     settings_.avOptions = text;
     return QvStatus::ok;

@@ -3,13 +3,13 @@
 
 #include <string>
 
-struct AVDictionary;
+#include "plugins/av/source/optionlist.h"
 
 namespace av {
 
 // What is wrong with the text for that format of the libraries, with similar names for one that is unknown;
-// "" if nothing is. `options`, which may be null, gets the entries.
-std::string parseMuxOptions(const std::string& text, const char* format, AVDictionary** options);
+// "" if nothing is. `options` gets the entries. Throws std::bad_alloc.
+std::string parseMuxOptions(const std::string& text, const char* format, OptionList& options);
 
 // They ask for MP4 in fragments, which has no index of the whole film.
 bool makesFragments(const std::string& options);
