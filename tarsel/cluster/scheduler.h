@@ -21,6 +21,7 @@ struct ClusterElement {
     std::string job;    // as `after` and cancel take it
     size_t index = 0;
     bool waits = false;  // otherwise it runs, begins or ends
+    std::string reason;  // why it waits, in the scheduler's word
 };
 
 class Scheduler {

@@ -118,15 +118,16 @@ std::vector<ClusterElement> SlurmScheduler::elements(const Words& arrays) const 
     if (arrays.empty()) return elements;
     const std::set<std::string> wanted(arrays.begin(), arrays.end());
     const Answer answer =
-        askSurely({"squeue", "--noheader", "--array", "--format=%j|%F|%K|%T"}, "", kQuestionPatience);
+        askSurely({"squeue", "--noheader", "--array", "--format=%j|%F|%K|%T|%r"}, "", kQuestionPatience);
     // One that is left out would be submitted again, so an answer that was cut is none.
     if (!answer.out.empty() && answer.out.back() != '\n') throw failure(Msg::schedulerGarbled, {"squeue"});
     for (const std::string& line : fieldsOf(answer.out, '\n')) {
         const Words fields = fieldsOf(line, '|');
         if (fields.empty() || !wanted.count(fields[0])) continue;
-        const auto index = fields.size() == 4 && indexOf(fields[1]) ? indexOf(fields[2]) : std::nullopt;
+        const auto index = fields.size() >= 4 && indexOf(fields[1]) ? indexOf(fields[2]) : std::nullopt;
         if (!index) throw failure(Msg::schedulerGarbled, {"squeue"});
-        elements.push_back({fields[0], fields[1], *index, fields[3] == "PENDING"});
+        elements.push_back(
+            {fields[0], fields[1], *index, fields[3] == "PENDING", fields.size() > 4 ? fields[4] : ""});
     }
     return elements;
 }

@@ -20,6 +20,7 @@ namespace {
 
 constexpr int kTick = 500;                  // ms
 constexpr int kEvery = 4;                   // ticks between two questions to the scheduler
+constexpr int kHeld = 3;                    // answers in a row without a running part, before that is told
 constexpr int kMostSilent = 30;             // answers that may be missing before its end is not waited for
 constexpr size_t kNameDigits = 16;          // of the array
 constexpr size_t kMostSaid = 1 << 20;       // bytes that are read at a time
@@ -137,7 +138,9 @@ void ClusterParts::look() {
     untilLook_ = kEvery;
     std::set<size_t> living;
     try {
-        for (const ClusterElement& element : scheduler_.elements({name_})) living.insert(element.index);
+        const std::vector<ClusterElement> elements = scheduler_.elements({name_});
+        for (const ClusterElement& element : elements) living.insert(element.index);
+        tellWhatHolds(elements);
         silent_ = 0;
     } catch (const Failure& failed) {
         if (silent_++ == 0) tell(Level::warning, lineOf(Msg::schedulerSilent, {how_.output, failed.what()}));
@@ -156,6 +159,15 @@ void ClusterParts::look() {
         failed_ = true;
         states_[part].failure = lineOf(Msg::splitPartLost, {how_.output, std::to_string(part + 1)});
     }
+}
+
+// Elements wait for a while before each start; where nothing of the job runs, its user wants to know why.
+void ClusterParts::tellWhatHolds(const std::vector<ClusterElement>& living) {
+    const bool held = !living.empty() && std::ranges::all_of(living, &ClusterElement::waits);
+    held_ = held ? held_ + 1 : 0;
+    if (held_ < kHeld || living.front().reason == reason_) return;
+    reason_ = living.front().reason;
+    tell(Level::note, lineOf(Msg::splitPartsHeld, {how_.output, reason_}));
 }
 
 // They are then waited for, as they still write into the folder.

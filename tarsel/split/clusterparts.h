@@ -40,6 +40,7 @@ class ClusterParts : public PartExecutor {
     void listen(size_t part);
     void end(size_t part, int status);
     void look();
+    void tellWhatHolds(const std::vector<ClusterElement>& living);
     void takeBack();
     bool finished() const;
 
@@ -53,6 +54,8 @@ class ClusterParts : public PartExecutor {
     std::string name_, job_;        // of the array
     int untilLook_ = 0;             // ticks
     int silent_ = 0;                // times in a row that the scheduler did not answer
+    int held_ = 0;                  // times in a row that all elements waited
+    std::string reason_;            // for which they do, as it was told last
     bool failed_ = false, takenBack_ = false, gone_ = false;
     Bell bell_;
     std::atomic<bool> cancelled_{false};

@@ -207,6 +207,7 @@ constexpr Message kMessages[] = {
     {Msg::splitPartKilled,   Exit::failed, "can't make {file}",                    "the process of part {text} was ended by signal {text}",               "see whether memory is short, or take fewer parts"},
     {Msg::splitPartFailed,   Exit::failed, "can't make {file}",                    "part {text} failed with status {text} and gave no reason",     "run the job without --split"},
     {Msg::splitPartLost,     Exit::failed, "can't make {file}",                    "part {text} was ended by the scheduler",                       "see whether it got enough time and memory"},
+    {Msg::splitPartsHeld,    Exit::done,   "{file}",                               "no part of it runs; the reason in the scheduler's word is {text}", ""},
     {Msg::splitSlurmAlone,   Exit::usage,  "--slurm",                              "it is for jobs in parts",                                      "give --split N, or 'tarsel batch LIST submit --slurm'"},
     {Msg::filterChannels,    Exit::usage,  "--filter {text}",                        "the sound has {text} channels, and it works on {text}", "take fewer with --channels"},
     {Msg::effectNoPicture,   Exit::usage,  "{option}",                               "this job has no picture",                               "leave it out"},

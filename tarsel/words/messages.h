@@ -207,6 +207,7 @@ enum class Msg : unsigned short {
     splitPartKilled,
     splitPartFailed,
     splitPartLost,
+    splitPartsHeld,
     splitSlurmAlone,
     filterChannels,
     effectNoPicture,

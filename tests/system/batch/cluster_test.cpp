@@ -459,10 +459,13 @@ TEST_F(RealSlurm, AJobInPartsHasTheBytesOfTheWhole) {
     failsAs(2, split({"--", "--array=1"}), {"can't be given"}, "own option");
     failsAs(2, tarsel({"run", "t.xml", "--slurm"}), {"--split"}, "no parts");
     EXPECT_EQ(listing(), before);
-    // One that is ended from outside fails the job, and the others are gone with it.
+    // Parts that Slurm holds are waited for, with its reason. One that is ended from outside fails the job, and
+    // the others are gone with it.
     Process endless(words({"transcode", "testgen:size=640x480,rate=25,duration=20000", "--no-audio", "--size",
-                           "16x12", "-o", "long.avi", "--split", "2", "--slurm"}),
+                           "16x12", "-o", "long.avi", "--split", "2", "--slurm", "--", "--hold"}),
                     surroundings());
+    EXPECT_TRUE(endless.waitFor("the reason in the scheduler's word is JobHeldUser"));
+    EXPECT_EQ(slurm({"sh", "-c", "scontrol release $(squeue -h -o %F)"}).status, 0);
     ASSERT_TRUE(comes([&] { return lines(slurm({"squeue", "-h", "-r", "-t", "R"}).out).size() == 2; }));
     EXPECT_EQ(slurm({"sh", "-c", "scancel $(squeue -h -r -o %i | head -n 1)"}).status, 0);
     const Outcome end = endless.finish();
