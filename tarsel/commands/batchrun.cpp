@@ -61,7 +61,7 @@ void runElement(const Given& given, TaskRun& how, const BatchFile& file, Signals
 
 void runTasks(const Given& given, const BatchFile& file, Signals& signals) {
     TaskRun how;
-    how.job.threads = limitThreads(given.threads);
+    how.job.threads = how.job.processors = limitThreads(given.threads);
     how.job.policy = given.outputs.policy();
     how.job.policy.quiet = how.job.quiet = given.quiet;
     how.job.progress = given.progress.mode;

@@ -25,6 +25,7 @@ struct JobOptions : PlanOptions {
     std::string presetName;                 // a preset's name or symbol
     std::shared_ptr<JobDivision> division;  // null for a job in one piece
     int threads = 0;                        // the most of each decoder and encoder; 0 for their own choice
+    int processors = 0;                     // for all parts of a division; 0 for those of the machine
     bool dryRun = false, quiet = false;
     bool relative = false;              // the task file has names that count from its folder
     bool unchanged = false;             // inputs that change meanwhile are failures

@@ -142,11 +142,10 @@ std::unique_ptr<PartExecutor> Split::makeExecutor(const Given& given) const {
     if (place_.slurm)
         return std::make_unique<ClusterParts>(
             slurm_, ClusterParts::How{words, place_.options, given.options.threads, output});
-    const int cores = std::max(static_cast<int>(std::thread::hardware_concurrency()), 1);
-    const int atOnce = std::min<int>(cores, static_cast<int>(parts_.size()));
-    const int threads = given.options.threads > 0 ? given.options.threads : std::max(cores / atOnce, 1);
-    words.insert(words.end(), {"--no-sync", "--threads", std::to_string(threads)});
-    return std::make_unique<LocalParts>(atOnce, words, output);
+    const PartShare share = shareOf(parts_.size(), static_cast<int>(std::thread::hardware_concurrency()),
+                                    given.options.threads, given.options.processors);
+    words.insert(words.end(), {"--no-sync", "--threads", std::to_string(share.threads)});
+    return std::make_unique<LocalParts>(share.atOnce, words, output);
 }
 
 // What each part has become; nothing when they were stopped.

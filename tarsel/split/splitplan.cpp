@@ -110,6 +110,12 @@ long long splitUnit(const JobPlan& plan) {
     return unit;
 }
 
+PartShare shareOf(size_t parts, int cores, int threads, int processors) {
+    const int most = processors > 0 ? processors : std::max(cores, 1);
+    const int atOnce = static_cast<int>(std::min<size_t>(parts, static_cast<size_t>(most)));
+    return {atOnce, threads > 0 && processors == 0 ? threads : std::max(most / atOnce, 1)};
+}
+
 SplitPlan planSplit(const JobPlan& plan, int parts) {
     requireKind(plan);
     const PlannedStream& picture = pictureOf(plan);

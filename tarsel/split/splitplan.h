@@ -34,6 +34,13 @@ const PlannedStream& pictureOf(const JobPlan& plan);
 // sample of each sound of the output.
 long long splitUnit(const JobPlan& plan);
 
+// How parts share a machine of so many cores. `threads`: of each part, and `processors`: of the whole job, as
+// they were given; 0 for neither.
+struct PartShare {
+    int atOnce, threads;
+};
+PartShare shareOf(size_t parts, int cores, int threads, int processors);
+
 // As equal as these multiples allow, and fewer than `parts` where there are not enough of them. Throws
 // Failure for a job whose parts would not be those of the whole, with the name of the filter that is in the
 // way.

@@ -77,6 +77,21 @@ TEST_F(SplitPlans, HeldPicturesAreInTheLastPart) {
     EXPECT_EQ(planSplit(plan, 4).points, (std::vector<long long>{0, 25, 50, 75, 1000}));
 }
 
+// Tasks of a batch share a machine with others; whoever runs one job says what each part takes.
+TEST_F(SplitPlans, PartsTakeNoMoreThanTheirShare) {
+    const struct {
+        size_t parts;
+        int cores, threads, processors, atOnce, each;
+    } cases[] = {{8, 4, 0, 0, 4, 1},  {2, 8, 0, 0, 2, 4},  {3, 8, 0, 0, 3, 2},
+                 {2, 0, 0, 0, 1, 1},  {4, 2, 1, 0, 2, 1},  {2, 2, 16, 0, 2, 16},
+                 {8, 64, 4, 4, 4, 1}, {2, 64, 8, 8, 2, 4}, {5, 2, 1, 1, 1, 1}};
+    for (const auto& given : cases) {
+        const PartShare share = shareOf(given.parts, given.cores, given.threads, given.processors);
+        EXPECT_EQ(share.atOnce, given.atOnce) << given.parts << " parts on " << given.cores;
+        EXPECT_EQ(share.threads, given.each) << given.parts << " parts on " << given.cores;
+    }
+}
+
 TEST_F(SplitPlans, WhatCanNotBeDividedIsNamed) {
     JobPlan moving = planOf("25", 100, 48000), dumping = moving, film = moving;
     moving.streams.front().filters.appendFilter("animatedlogo", AnyDict("name", "animatedlogo", "_on", 1));
