@@ -304,7 +304,8 @@ void info(const Given& given) {
                 all.push_back(showTask(name, given.json));
                 continue;
             }
-            const Source source(name, given.raw, standard.get(), {.upright = false, .exact = given.exact});
+            const Source source(name, given.raw, standard.get(),
+                                {.upright = false, .exact = given.exact, .survey = !given.exact});
             all.push_back(describe(source));
             if (!given.json) printFile(all.back());
             if (all.back().contains("damage"))

@@ -352,7 +352,9 @@ void Source::openFile(const Films& films) {
     if (!decoder_ && isMixName(formatName_)) decoder_ = openMix(name_);
     if (decoder_) return;
     Any params = openParameters(formatName_);
-    if (isFilm(formatName_)) params = AnyDict("upright", films.upright ? 1 : 0, "exact", films.exact ? 1 : 0);
+    if (isFilm(formatName_))
+        params = AnyDict("upright", films.upright ? 1 : 0, "exact", films.exact ? 1 : 0, "survey",
+                         films.survey ? 1 : 0);
     if (pictures_.isSet("pictures")) {
         params = pictures_;
         params.asDict().set("upright", films.upright ? 1 : 0);

@@ -20,9 +20,10 @@ class Source {
     struct Films {
         bool upright = true;  // turned as they say that they are to be shown
         bool exact = false;   // counted packet by packet, also where tables say how many there are
+        bool survey = false;  // only what they are is asked for
     };
     Source(const std::string& spec, const std::string& raw, StandardInput* standard = nullptr,
-           const Films& films = {true, false});
+           const Films& films = {true, false, false});
     // One that is open already; it has to outlive this.
     explicit Source(QvDecodePipe& decoder);
     // The same for a decoder that reads others.

@@ -53,6 +53,12 @@ constexpr QvParamRow<Settings> rows[] = {
      .min = 0,
      .max = 1,
      .help = "1: packets are counted by reading all of the file; 0: by its table, where it has a whole one"},
+    {.name = "survey",
+     .member = &Settings::survey,
+     .flags = qvParamPlain,
+     .min = 0,
+     .max = 1,
+     .help = "1: only to say what the film is; counts are those of its tables, and nothing can be read"},
     {.name = "pictures",
      .member = &Settings::pictures,
      .flags = qvParamStored,
@@ -149,7 +155,10 @@ int AvDec::openFilm() {
     }
     const auto input = MediaInput::open(*bytes_, settings_.container, reason);
     if (!input) return refuse(reason);
-    index_ = PacketIndex::build(*input, reason, settings_.exact != 0);
+    const auto from = settings_.exact    ? PacketIndex::From::packets
+                      : settings_.survey ? PacketIndex::From::survey
+                                         : PacketIndex::From::table;
+    index_ = PacketIndex::build(*input, reason, from);
     if (!index_) return refuse(reason);
     addStreams(*input, reason);
     if (streams().empty()) return refuse(reason.empty() ? "it has neither pictures nor sound" : reason);
@@ -231,20 +240,25 @@ int AvDec::close() {
     return result;
 }
 
+int AvDec::refuseSurvey() { return setError(QvStatus::notSupported, "The film is only open for a survey"); }
+
 int AvDec::seekToFrame(long long frame, int stream) {
     checkStream(qvVideoStream, stream, "seekToFrame");
+    if (settings_.survey) return refuseSurvey();
     auto& pictures = static_cast<PictureStream&>(*findStream(qvVideoStream, stream));
     return pictures.seek(frame) ? QvStatus::ok : setError(QvStatus::endOfStream, "Seek failed");
 }
 
 int AvDec::seekToSample(long long sample, int stream) {
     checkStream(qvAudioStream, stream, "seekToSample");
+    if (settings_.survey) return refuseSurvey();
     auto& sound = static_cast<SoundStream&>(*findStream(qvAudioStream, stream));
     return sound.seek(sample) ? QvStatus::ok : setError(QvStatus::endOfStream, "Seek failed");
 }
 
 int AvDec::readFrame(int stream) {
     checkStream(qvVideoStream, stream, "readFrame");
+    if (settings_.survey) return refuseSurvey();
     auto& pictures = static_cast<PictureStream&>(*findStream(qvVideoStream, stream));
     const int result = pictures.read();
     if (result == QvStatus::cannotParse)
@@ -254,6 +268,7 @@ int AvDec::readFrame(int stream) {
 
 int AvDec::readSamples(int count, int stream) {
     checkStream(qvAudioStream, stream, "readSamples");
+    if (settings_.survey) return refuseSurvey();
     auto& sound = static_cast<SoundStream&>(*findStream(qvAudioStream, stream));
     const int result = sound.read(count);
     if (result == QvStatus::outOfMemory) return setError(result, "Out of memory");

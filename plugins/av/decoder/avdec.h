@@ -9,9 +9,11 @@
 // of each stream's codec, 0: one a core), "upright" (stored; 1: frames are delivered as the film is to be
 // shown, turned and mirrored, and "rotation" and "mirrored" are absent then; 0, as it is at first: as they
 // are coded), "exact" (1: packets are counted by reading all of the file, also where a table says how many
-// there are), "pictures" (stored; N above 0: the file and those that follow it by number, N in all, are the
-// frames, a picture each) and "framerate" (stored; theirs, 25 at first), "container" (stored; the libraries'
-// name of the format, "": found out), "openParameters" and "settings" (a Dict of these).
+// there are), "survey" (1: to look at what the film is; counts are those of its tables where it has them, and
+// nothing can be read or sought), "pictures" (stored; N above 0: the file and those that follow it by number,
+// N in all, are the frames, a picture each) and "framerate" (stored; theirs, 25 at first), "container"
+// (stored; the libraries' name of the format, "": found out), "openParameters" and "settings" (a Dict of
+// these).
 //
 // A stream of pictures has, besides what the contract asks for:
 //
@@ -65,7 +67,7 @@ class AvDec : public BaseDecodePipe {
         QvByteSource* source = nullptr;  // borrowed; null: the file
         int threads = 0;
         int upright = 0;
-        int exact = 0;
+        int exact = 0, survey = 0;
         int pictures = 0;
         QvFramerate rate{25.0};
         std::string container;
@@ -101,6 +103,7 @@ class AvDec : public BaseDecodePipe {
 
     int setAll(const Any& value);
     int refuse(const std::string& reason);
+    int refuseSurvey();
     void addStreams(MediaInput& input, std::string& reason);
     int pictureOf(int subpicture) const;
     int openFilm();

@@ -33,9 +33,93 @@ IndexedPacket indexed(const AVPacket& packet) {
     return row;
 }
 
+// Packets that are read before a table is believed, of all streams: enough to see in which way times of
+// presentation differ from those of decoding.
+constexpr std::size_t enoughRead = 256;
+
+IndexedPacket tabled(const AVIndexEntry& entry, std::int64_t time) {
+    IndexedPacket row{time, entry.timestamp, entry.pos, 0, 0, 0, 0, static_cast<std::uint32_t>(entry.size)};
+    if (entry.flags & AVINDEX_KEYFRAME) row.flags |= AV_PKT_FLAG_KEY;
+    if (entry.flags & AVINDEX_DISCARD_FRAME) row.flags |= AV_PKT_FLAG_DISCARD;
+    return row;
+}
+
+// The table of a stream as packets: those that were read, and the others with times that follow from these.
+// Nothing where the table and what was read differ, or where times don't follow.
+std::vector<IndexedPacket> rowsOf(AVStream& stream, const std::vector<IndexedPacket>& read, long long bytes) {
+    const int count = avformat_index_get_entries_count(&stream);
+    const bool pictures = stream.codecpar->codec_type == AVMEDIA_TYPE_VIDEO;
+    if (count < static_cast<int>(read.size()) || (pictures && read.empty())) return {};
+    std::vector<IndexedPacket> rows;
+    rows.reserve(static_cast<std::size_t>(count));
+    bool discards = false;
+    for (int i = 0; i < count; ++i) {
+        const AVIndexEntry& entry = *avformat_index_get_entry(&stream, i);
+        if (entry.size < 0 || entry.pos < 0 || entry.pos > bytes - entry.size) return {};
+        rows.push_back(tabled(entry, entry.timestamp));
+        discards = discards || (entry.flags & AVINDEX_DISCARD_FRAME) != 0;
+        if (i == 0) continue;
+        auto& before = rows[rows.size() - 2];
+        const std::int64_t step = entry.timestamp - before.dts;
+        if (step < 0 || step > UINT_MAX) return {};
+        before.duration = static_cast<std::uint32_t>(step);
+    }
+    IndexedPacket& last = rows.back();
+    if (stream.duration > last.dts && stream.duration - last.dts < UINT_MAX)
+        last.duration = static_cast<std::uint32_t>(stream.duration - last.dts);
+    else if (rows.size() > 1)
+        last.duration = rows[rows.size() - 2].duration;
+    std::int64_t first = INT64_MAX;
+    bool moved = false;
+    for (std::size_t i = 0; i < read.size(); ++i) {
+        if (read[i].position != rows[i].position || read[i].pts == AV_NOPTS_VALUE) return {};
+        first = std::min(first, read[i].pts);
+        moved = moved || read[i].pts != rows[i].dts;
+    }
+    if (!moved) {
+        std::copy(read.begin(), read.end(), rows.begin());
+        return rows;
+    }
+    // Pictures that are decoded in another order: at equal steps they have the times of decoding, moved.
+    const std::int64_t step = rows.front().duration, shift = first - rows.front().dts;
+    const auto isEqual = [step](const IndexedPacket& row) { return row.duration == step; };
+    const auto fits = [&](const IndexedPacket& row) { return (row.pts - first) % step == 0; };
+    if (step <= 0 || discards || !pictures || !std::all_of(rows.begin(), rows.end() - 1, isEqual) ||
+        !std::all_of(read.begin(), read.end(), fits))
+        return {};
+    for (IndexedPacket& row : rows) row.pts = row.dts + shift;
+    return rows;
+}
+
 }  // namespace
 
-std::unique_ptr<PacketIndex> PacketIndex::build(MediaInput& input, std::string& reason, bool whole) {
+// Takes what is missing from the tables, if they have it for all streams.
+bool PacketIndex::continueByTable(const AVFormatContext& container, std::vector<PacketSamples>& samples,
+                                  long long bytes) {
+    std::vector<std::vector<IndexedPacket>> all;
+    std::size_t count = 0;
+    for (unsigned i = 0; i < container.nb_streams; ++i) {
+        AVStream& stream = *container.streams[i];
+        const bool any = avformat_index_get_entries_count(&stream) > 0;
+        all.push_back(any ? rowsOf(stream, streams_[i], bytes) : streams_[i]);
+        if (any && all.back().empty()) return false;
+        count += all.back().size();
+    }
+    if (count > limits::packets) return false;
+    const PacketPtr packet(av_packet_alloc());
+    if (!packet) return false;
+    for (unsigned i = 0; i < container.nb_streams; ++i) {
+        if (container.streams[i]->codecpar->codec_type != AVMEDIA_TYPE_AUDIO) continue;
+        for (std::size_t row = streams_[i].size(); row < all[i].size(); ++row) {
+            packet->size = static_cast<int>(all[i][row].bytes);
+            all[i][row].samples = samples[i].next(*packet);
+        }
+    }
+    streams_ = std::move(all);
+    return true;
+}
+
+std::unique_ptr<PacketIndex> PacketIndex::build(MediaInput& input, std::string& reason, From from) {
     auto index = std::make_unique<PacketIndex>();
     const AVFormatContext& container = input.context();
     index->streams_.resize(container.nb_streams);
@@ -46,7 +130,7 @@ std::unique_ptr<PacketIndex> PacketIndex::build(MediaInput& input, std::string& 
         reason = "out of memory";
         return nullptr;
     }
-    if (!whole) input.leaveBytes();
+    const bool tables = from != From::packets && input.leaveBytes();
     std::size_t count = 0;
     for (;;) {
         const MediaInput::Read result = input.read(*packet);
@@ -64,6 +148,9 @@ std::unique_ptr<PacketIndex> PacketIndex::build(MediaInput& input, std::string& 
             reason = tooMany;
             return nullptr;
         }
+        if (tables && from == From::survey && count == enoughRead &&
+            index->continueByTable(container, samples, input.size()))
+            break;
     }
     if (count == 0) {
         reason = index->damage_.empty() ? "it is empty" : index->damage_;

@@ -10,6 +10,8 @@
 #include "plugins/av/index/packetsamples.h"
 #include "plugins/av/source/mediainput.h"
 
+struct AVFormatContext;
+
 namespace av {
 
 struct IndexedPacket {
@@ -30,11 +32,17 @@ class PacketIndex {
   public:
     static constexpr const char* tooMany = "it has more packets than can be indexed";  // a reason
 
+    enum class From {
+        packets,  // all are read
+        table,    // the same, without their bytes where the container's tables say all
+        survey,  // the table itself where it has all packets: as many as there are, from the first time on to
+                 // the last, but which packet has which time is not known. For counting only.
+    };
     // Reads `input` from its start to its end, all streams, and rewinds it. What a damaged file has up to its
     // damage is kept: damage() says what happened. Null with `reason` when there is not even a packet, or
     // more than the limits allow.
-    // The bytes of the packets are not read where the container's tables say all, unless `whole`.
-    static std::unique_ptr<PacketIndex> build(MediaInput& input, std::string& reason, bool whole = false);
+    static std::unique_ptr<PacketIndex> build(MediaInput& input, std::string& reason,
+                                              From from = From::table);
 
     const std::vector<IndexedPacket>& packets(int stream) const {
         return streams_[static_cast<unsigned>(stream)];
@@ -49,6 +57,9 @@ class PacketIndex {
     const std::string& damage() const { return damage_; }  // "" for none; else a part of a sentence
 
   private:
+    bool continueByTable(const AVFormatContext& container, std::vector<PacketSamples>& samples,
+                         long long bytes);
+
     std::vector<std::vector<IndexedPacket>> streams_;
     std::string damage_;
 };

@@ -15,6 +15,7 @@ namespace {
 
 // On any thread of the libraries: the line lives on the stack.
 void toEngine(void* object, int level, const char* format, va_list args) {
+    if (level > AV_LOG_INFO) return;  // a demultiplexer has such a line for each packet
     ConcealedPackets::heard(object, format);
     if (level > AV_LOG_WARNING || !qv_dbg()->hasTarget()) return;
     char text[1024];

@@ -270,6 +270,8 @@ MediaInput::~MediaInput() = default;
 AVFormatContext& MediaInput::context() { return *state_->context; }
 const AVFormatContext& MediaInput::context() const { return *state_->context; }
 
+long long MediaInput::size() const { return state_->bytes.source->size(); }
+
 std::unique_ptr<MediaInput> MediaInput::open(const MediaBytes& bytes, const std::string& format,
                                              std::string& reason) {
     std::unique_ptr<MediaInput> input(new MediaInput);

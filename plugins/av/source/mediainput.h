@@ -55,6 +55,7 @@ class MediaInput {
 
     AVFormatContext& context();
     const AVFormatContext& context() const;
+    long long size() const;  // bytes; QvByteSource::unknown of a pipe
 
     // From here on only packets of this stream are delivered; others are skipped where the container can, and
     // are never decoded. -1: of all streams.

@@ -3,7 +3,10 @@
 
 #include <gmock/gmock.h>
 
+#include "core/engine/status.h"
+#include "plugins/av/decoder/avdec.h"
 #include "tests/plugins/av/films.h"
+#include "tests/support/engine.h"
 
 namespace {
 
@@ -30,6 +33,26 @@ TEST_F(FilmsInTheTool, areShownAndTranscodedToTheirLastPicture) {
 
     const Outcome picture = tarsel({"frame", "film.mp4", "--at", "1", "-o", "one.png"});
     EXPECT_EQ(picture.status, 0) << picture.err;
+}
+
+// A survey knows how many pictures there are and not which comes when, so it gives none.
+TEST_F(FilmsInTheTool, areNotReadInASurvey) {
+    const EngineScope engine;
+    av::AvDec decoder;
+    decoder.setParam("filename",
+                     Any(film("long.mp4", {"-c:v", "mpeg4", "-bf", "2", "-c:a", "aac"},
+                              "testsrc2=size=96x64:rate=25:duration=8[out0];sine=duration=8[out1]")
+                             .c_str()));
+    for (const bool survey : {true, false}) {
+        const int expected = survey ? QvStatus::notSupported : QvStatus::ok;
+        ASSERT_EQ(decoder.setParam("survey", survey ? 1 : 0), QvStatus::ok);
+        ASSERT_EQ(decoder.open(), QvStatus::ok) << decoder.errorDesc();
+        EXPECT_EQ(decoder.nrFrames(0), 200);
+        EXPECT_EQ(decoder.seekToFrame(9, 0), expected);
+        EXPECT_EQ(decoder.readFrame(0), expected);
+        EXPECT_EQ(decoder.seekToSample(9, 0), expected);
+        EXPECT_EQ(decoder.readSamples(64, 0), survey ? expected : 64);
+    }
 }
 
 TEST_F(FilmsInTheTool, areTurnedUprightUnlessTheyAreWantedAsCoded) {
