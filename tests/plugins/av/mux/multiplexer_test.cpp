@@ -476,7 +476,7 @@ TEST_F(Multiplexers, checkOptionsWhenTheyAreSet) {
     const struct {
         const char *text, *why;
     } wrong[] = {
-        {"muxrat=1", "similar: muxrate"},
+        {"muxrat=1", "similar: 'muxrate'"},
         {"muxrate", "no list of name=value"},
         {"muxrate=fast", "'fast' is no value of the option muxrate"},
         {"movflags=faststart", "'movflags' is no option of mpegts"},
