@@ -1,47 +1,19 @@
-// The sound encoders over the libraries, and PCM as it is: "aacaenc" and the other rows of SoundCodec.
+// The sound encoders of the libraries, and PCM: "aacaenc" and the other rows of SoundCodec.
 //
-// Samples of the set format come in; units in elementary form (ADTS for AAC, low byte first for PCM) go out
-// with the records of "plugins/wire.h". Priming has times below 0. The head is sent again at close where
-// padding follows the last sample, or the codec's own data are known only then.
+// Input: samples in the format of the settings. Output: the records of "plugins/wire.h" with
+// units in elementary form (ADTS for AAC, little-endian for PCM). Samples before time 0 are encoder priming.
+// close() sends the head again with what is known only then: the padding after the last sample, and extradata
+// that the encoder has changed.
 #pragma once
 
-#include <cstdint>
-#include <span>
 #include <string>
 
 #include "core/encode/qvencoder.h"
-#include "core/engine/modules/params.h"
-#include "core/measure/qvgeometry.h"
+#include "plugins/av/encode/soundsettings.h"
 #include "plugins/av/encode/unitwriter.h"
 #include "plugins/av/source/avheaders.h"
 
 namespace av {
-
-struct SoundCodec {
-    const char* module;
-    const char* encoder;  // the libraries' name; "" for PCM
-    const char* fourcc;
-    const char* extension;
-    std::span<const int> rates, kilobits;  // without bit rates: the size follows from the sound
-    std::span<const int> channels;
-    int usualKilobits;
-    std::span<const int> lowKilobits = {};  // of rates below those of MPEG-1, where these are others
-    const AVCodec* library() const { return avcodec_find_encoder_by_name(encoder); }
-};
-const SoundCodec* soundCodec(const char* module);
-
-struct SoundSettings {
-    explicit SoundSettings(const SoundCodec& row) : codec(&row), kilobits(row.usualKilobits) {}
-
-    const SoundCodec* codec;
-    int samplerate = 48000, channels = 2, bits = 16, profile = -1, threads = 0;
-    int kilobits;  // that are wanted; the nearest of those that the rate has is used
-    std::string options;
-
-    // The bit rate was asked for, as far as can be known.
-    bool stated() const { return !codec->kilobits.empty() && kilobits != codec->usualKilobits; }
-    static std::span<const QvParamRow<SoundSettings>> rows();
-};
 
 class SoundEnc : public QvAudioEncoder {
   public:
@@ -64,8 +36,9 @@ class SoundEnc : public QvAudioEncoder {
     FramePtr frame_;
     PacketPtr packet_;
     UnitWriter output_;
-    int filled_ = 0;                  // samples of the frame that is being filled
-    long long taken_ = 0, sent_ = 0;  // samples in, and in units
+    int filled_ = 0;       // samples that frame_ has so far
+    long long taken_ = 0;  // samples that were encoded
+    long long sent_ = 0;   // samples of the units that were written, priming and padding included
 
     std::string prepare();
     bool sendHead(bool last);

@@ -28,7 +28,7 @@ constexpr VideoForm mpeg2Forms[] = {{I420, AV_PIX_FMT_YUV420P}, {YUYV, AV_PIX_FM
 constexpr VideoForm dnxForms[] = {{YUYV, AV_PIX_FMT_YUV422P},
                                   {Y216, AV_PIX_FMT_YUV422P10LE, "dnxhr_hqx"},
                                   {b64a, AV_PIX_FMT_YUV444P10LE, "dnxhr_444"}};
-// The layout follows the type of tape and the lines, see VideoEnc.
+// The layout follows from profile and height, see VideoEnc::layout.
 constexpr VideoForm dvForms[] = {{YUYV, AV_PIX_FMT_YUV422P}};
 constexpr VideoForm j2kForms[] = {{YUYV, AV_PIX_FMT_YUV422P},
                                   {I420, AV_PIX_FMT_YUV420P},
@@ -50,32 +50,32 @@ constexpr const char* x265Tunes = " psnr ssim grain fastdecode zerolatency anima
 // clang-format off
 constexpr auto rows = std::to_array<VideoCodec>({
     // module    standard  encoder       forms        fourcc  ext     traits
-    //   sides least most step   bits low high usual     quality usual most   preset usual        tune    N    M  most M
-    {"h264venc",    "",       "libx264",    x264Forms,   "H264", "264",  predictive | interlaced | setsFirst | borrows | statsFile | captions,
+    //   sides min max step      bit/s min max default    quality default max  preset default      tune    N    M  max M
+    {"h264venc",    "",       "libx264",    x264Forms,   qvFourcc("H264"), "264",  predictive | interlaced | setsFirst | borrows | statsFile | captions,
         16, 16384, 2,   32e3, 800e6, 0,       "crf", 21, 51,      "preset", "medium",         "tune", 250, 4, 17, "x264-params=force-cfr=1", "", speeds, x264Tunes},
-    {"mpegvenc",    "MPEG-2", "mpeg2video", mpeg2Forms,  "MPG2", "m2v",  predictive | interlaced | statsText | captions,
+    {"mpegvenc",    "MPEG-2", "mpeg2video", mpeg2Forms,  qvFourcc("MPG2"), "m2v",  predictive | interlaced | statsText | captions,
         16, 4096, 2,    100e3, 300e6, 8e6,    "", 0, 0,         "", "",                        "",     15,  3, 8,  "sc_threshold=1000000000", ""},
-    {"mpegvenc",    "MPEG-1", "mpeg1video", plainForms,  "MPG1", "m1v",  predictive | statsText,
+    {"mpegvenc",    "MPEG-1", "mpeg1video", plainForms,  qvFourcc("MPG1"), "m1v",  predictive | statsText,
         16, 4080, 2,    100e3, 100e6, 1.15e6, "", 0, 0,         "", "",                        "",     15,  3, 8,  "sc_threshold=1000000000", ""},
-    {"mpeg4venc",   "MPEG-4", "mpeg4",      plainForms,  "MP4V", "m4v",  predictive | interlaced | setsFirst | statsText,
+    {"mpeg4venc",   "MPEG-4", "mpeg4",      plainForms,  qvFourcc("MP4V"), "m4v",  predictive | interlaced | setsFirst | statsText,
         16, 4096, 2,    16e3, 100e6, 2e6,     "", 0, 0,         "", "",                        "",     150, 1, 4,  "sc_threshold=1000000000", ""},
-    {"mpeg4venc",   "H.263",  "h263",       plainForms,  "H263", "263",  rated | groups | statsText,
+    {"mpeg4venc",   "H.263",  "h263",       plainForms,  qvFourcc("H263"), "263",  rated | groups | statsText,
         96, 1408, 4,    16e3, 8e6, 96e3,      "", 0, 0,         "", "",                        "",     150, 1, 1,  "sc_threshold=1000000000", ""},
-    {"vc3venc",     "",       "dnxhd",      dnxForms,    "AVDN", "dnxhd", interlaced | keepsForm,
+    {"vc3venc",     "",       "dnxhd",      dnxForms,    qvFourcc("AVDN"), "dnxhd", interlaced | keepsForm,
         256, 8192, 2,   1e6, 2e9, 0,          "", 0, 0,         "", "",                        "",     1,   1, 1,  "", "dnxhr_hq"},
-    {"dvvenc",      "",       "dvvideo",    dvForms,     "DVSD", "dv",   interlaced,
+    {"dvvenc",      "",       "dvvideo",    dvForms,     qvFourcc("DVSD"), "dv",   interlaced,
         480, 1440, 1,   25e6, 100e6, 0,        "", 0, 0,         "", "",                        "",     1,   1, 1,  "", "25"},
-    {"dv100venc",   "",       "dvvideo",    dvForms,     "DVH1", "dv",   interlaced,
+    {"dv100venc",   "",       "dvvideo",    dvForms,     qvFourcc("DVH1"), "dv",   interlaced,
         720, 1440, 1,   100e6, 100e6, 0,      "", 0, 0,         "", "",                        "",     1,   1, 1,  "", "100"},
-    {"mj2kvenc",    "",       "jpeg2000",   j2kForms,    "MJ2K", "j2k",  interlaced,
+    {"mj2kvenc",    "",       "jpeg2000",   j2kForms,    qvFourcc("MJ2K"), "j2k",  interlaced,
         16, 8192, 1,    1e6, 2e9, 0,          "", 0, 0,         "", "",                        "",     1,   1, 1,  "format=j2k", ""},
-    {"h265venc",    "",       "libx265",    x265Forms,   "HEVC", "265",  predictive | setsFirst | borrows | statsFile,
+    {"h265venc",    "",       "libx265",    x265Forms,   qvFourcc("HEVC"), "265",  predictive | setsFirst | borrows | statsFile,
         16, 16384, 2,   32e3, 800e6, 0,       "crf", 24, 51,      "preset", "medium",         "tune", 250, 5, 17, "", "", speeds, x265Tunes},
-    {"proresvenc",  "",       "prores_ks",  proresForms, "APCH", "mov",  interlaced | keepsForm,
+    {"proresvenc",  "",       "prores_ks",  proresForms, qvFourcc("APCH"), "mov",  interlaced | keepsForm,
         16, 16384, 2,   1e6, 4e9, 0,          "", 0, 0,         "", "",                        "",     1,   1, 1,  "vendor=apl0", "hq"},
-    {"ffv1venc",    "",       "ffv1",       ffv1Forms,   "FFV1", "mkv",  interlaced | keepsForm,
+    {"ffv1venc",    "",       "ffv1",       ffv1Forms,   qvFourcc("FFV1"), "mkv",  interlaced | keepsForm,
         16, 16384, 1,   1e6, 4e9, 0,          "", 0, 0,         "", "",                        "",     1,   1, 1,  "level=3:slicecrc=1:slices=4", ""},
-    {"av1venc",     "",       "libaom-av1", aomForms,    "AV01", "obu",  rated | groups | borrows | statsText | pixelAspect,
+    {"av1venc",     "",       "libaom-av1", aomForms,    qvFourcc("AV01"), "obu",  rated | groups | borrows | statsText | pixelAspect,
         16, 16384, 2,   32e3, 800e6, 0,       "crf", 32, 63,      "cpu-used", "6",            "tune", 250, 1, 1,  "row-mt=1", ""},
 });
 // clang-format on

@@ -25,13 +25,14 @@ std::span<const std::uint8_t> bytesOf(const AVPacket& packet) {
 bool is(const VideoCodec& codec, const char* module) { return std::strcmp(codec.module, module) == 0; }
 
 struct ProresKind {
-    const char* fourcc;
-    unsigned tag;
+    unsigned fourcc;  // of the units
+    unsigned tag;     // the library's
 };
 // In the order of the profile numbers.
-constexpr ProresKind proresKinds[] = {{"APCO", qvFourcc("apco")}, {"APCS", qvFourcc("apcs")},
-                                      {"APCN", qvFourcc("apcn")}, {"APCH", qvFourcc("apch")},
-                                      {"AP4H", qvFourcc("ap4h")}, {"AP4X", qvFourcc("ap4x")}};
+constexpr ProresKind proresKinds[] = {
+    {qvFourcc("APCO"), qvFourcc("apco")}, {qvFourcc("APCS"), qvFourcc("apcs")},
+    {qvFourcc("APCN"), qvFourcc("apcn")}, {qvFourcc("APCH"), qvFourcc("apch")},
+    {qvFourcc("AP4H"), qvFourcc("ap4h")}, {qvFourcc("AP4X"), qvFourcc("ap4x")}};
 
 // The library states the kind of ProRes by its tag alone.
 int profileOf(const AVCodecContext& context, const VideoCodec& codec) {
@@ -42,15 +43,9 @@ int profileOf(const AVCodecContext& context, const VideoCodec& codec) {
     return kind != std::end(proresKinds) ? static_cast<int>(kind - std::begin(proresKinds)) : -1;
 }
 
-const char* fourccOf(const AVCodecContext& context, const VideoCodec& codec) {
+unsigned fourccOf(const AVCodecContext& context, const VideoCodec& codec) {
     const int profile = profileOf(context, codec);
     return is(codec, "proresvenc") && profile >= 0 ? proresKinds[profile].fourcc : codec.fourcc;
-}
-
-unsigned fourccNumber(const char* text) {
-    unsigned value = 0;
-    for (int i = 3; i >= 0; --i) value = value << 8 | static_cast<unsigned char>(text[i]);
-    return value;
 }
 
 }  // namespace
@@ -80,7 +75,7 @@ void VideoEnc::getParam(const char* name, Any& value) const {
 void VideoEnc::store(AnyDict& state) const {
     AnyDict settings;
     qvStoreParamRows<VideoSettings>(VideoSettings::rows(*settings_.codec), settings_, settings);
-    if (settings_.most > 0) settings.set("maxVBitrate", settings_.most);
+    if (settings_.maxBitrate > 0) settings.set("maxVBitrate", settings_.maxBitrate);
     state = AnyDict("name", name(), "settingsDict", settings);
 }
 
@@ -123,7 +118,7 @@ int VideoEnc::open() {
     return QvStatus::ok;
 }
 
-// Tapes have one layout a system.
+// In DV of 25 Mbit/s the sampling of the chroma follows from the height and the profile.
 AVPixelFormat VideoEnc::layout() const {
     const VideoForm& form = *settings_.codec->form(settings_.type);
     if (!is(*settings_.codec, "dvvenc") || settings_.codecProfile == "50" || settings_.codecProfile == "100")
@@ -138,19 +133,19 @@ std::string VideoEnc::prepare() {
     const AVCodec* const library = codec.library();
     if (!library) return std::string("The installed library has no encoder ") + codec.encoder;
     if (s.width < 1 || s.height < 1) return "No size of the picture is set";
-    if (!s.rateKnown) return "No frame rate is set";
-    const int least = std::min(codec.least, 16);
-    if (std::max(s.width, s.height) > codec.most || std::min(s.width, s.height) < least ||
-        s.width % codec.step != 0 || s.height % codec.step != 0)
-        return "Sides of pictures are " + std::to_string(least) + " to " + std::to_string(codec.most) +
-               " pixels" + (codec.step > 1 ? ", multiples of " + std::to_string(codec.step) : "") + ", not " +
-               std::to_string(s.width) + "x" + std::to_string(s.height);
-    if (!s.takesSize())
+    if (!s.hasRate) return "No frame rate is set";
+    const int least = std::min(codec.minSide, 16);
+    if (std::max(s.width, s.height) > codec.maxSide || std::min(s.width, s.height) < least ||
+        s.width % codec.sideStep != 0 || s.height % codec.sideStep != 0)
+        return "Sides of pictures are " + std::to_string(least) + " to " + std::to_string(codec.maxSide) +
+               " pixels" + (codec.sideStep > 1 ? ", multiples of " + std::to_string(codec.sideStep) : "") +
+               ", not " + std::to_string(s.width) + "x" + std::to_string(s.height);
+    if (!s.supportsSize())
         return "H.263 has pictures of 128x96, 176x144, 352x288, 704x576 and 1408x1152, not of " +
                std::to_string(s.width) + "x" + std::to_string(s.height);
-    if (s.codesFields() && !s.takesFields())
+    if (s.isInterlaced() && !s.supportsFields())
         return "The codec takes two fields a picture in 4:2:2 of 1920x1080 only";
-    if (s.twoPass && !s.passes) return "There are no statistics of a first pass";
+    if (s.twoPass && !s.passRecord) return "There are no statistics of a first pass";
     context_.reset(avcodec_alloc_context3(library));
     packet_.reset(av_packet_alloc());
     if (!context_ || !packet_) return "Out of memory";
@@ -194,7 +189,7 @@ std::string VideoEnc::configure(AVPixelFormat layout) {
     c.framerate = {c.time_base.den, c.time_base.num};
     c.sample_aspect_ratio = {1, 1};
     if (s.frameAspect > 0) c.sample_aspect_ratio = av_d2q(s.frameAspect * s.height / s.width, longestPixel);
-    // What DNxHR says of the colours that RGB becomes is BT.709, whatever the size.
+    // DNxHR in 4:4:4 is always labelled BT.709, so RGB is converted with that matrix.
     const bool dnxRgb = is(*s.codec, "vc3venc") && s.type == QvFourcc::b64a;
     const bool hd = s.matrix == 2 || (s.matrix == 0 && (s.height >= hdLines || dnxRgb));
     const bool film = s.height == 480 || s.height == 512;
@@ -216,13 +211,14 @@ std::string VideoEnc::configure(AVPixelFormat layout) {
     }
     if (s.codec->has(VideoTrait::setsFirst) || is(*s.codec, "ffv1venc") || is(*s.codec, "av1venc"))
         c.flags |= AV_CODEC_FLAG_GLOBAL_HEADER;
-    // A number means pictures at a time to H.265, 16 at most; its pool has the threads, see configurePass.
+    // The H.265 library takes this number as pictures at a time, up to 16. Its threads are a pool of their
+    // own, see configurePass.
     c.thread_count = is(*s.codec, "h265venc") ? 0 : s.threads;
     c.strict_std_compliance = FF_COMPLIANCE_UNOFFICIAL;
     return setOptions(c, s.codec->options);
 }
 
-// The codec's own words: profile, preset, tune.
+// Profile, preset and tune.
 std::string VideoEnc::describeCodec() {
     const VideoSettings& s = settings_;
     AVCodecContext& c = *context_;
@@ -233,10 +229,10 @@ std::string VideoEnc::describeCodec() {
     if (!set(s.codec->tune, s.tune)) return "There is no tune '" + s.tune + "'";
     if (is(*s.codec, "dvvenc") || is(*s.codec, "dv100venc")) return "";
     const VideoForm& form = *s.codec->form(s.type);
-    std::string profile = s.codesFields() && is(*s.codec, "vc3venc") ? "dnxhd"
-                          : form.profile                             ? form.profile
-                                                                     : s.codecProfile;
-    // The library writes to the standard error about profiles that do not go with the rest.
+    std::string profile = s.isInterlaced() && is(*s.codec, "vc3venc") ? "dnxhd"
+                          : form.profile                              ? form.profile
+                                                                      : s.codecProfile;
+    // Checked here because the library reports an unfit profile on the standard error only.
     if (is(*s.codec, "h264venc")) {
         const bool lossless =
             s.byQuality() && s.quality < 1 && s.type != QvFourcc::W016 && s.type != QvFourcc::Y216;
@@ -244,7 +240,7 @@ std::string VideoEnc::describeCodec() {
         if (lossless && !profile.empty() && profile != "high444")
             return "The profile '" + profile + "' has no lossless pictures, which crf " +
                    std::to_string(s.quality) + " asks for";
-        if (profile == "baseline" && s.codesFields())
+        if (profile == "baseline" && s.isInterlaced())
             return "The profile 'baseline' has no interlaced pictures";
     }
     if (!set("profile", profile)) return "There is no profile '" + profile + "'";
@@ -264,37 +260,38 @@ std::string VideoEnc::configureRate() {
     }
     if (!s.timecode.empty() && is(*s.codec, "mpegvenc")) {
         std::string timecode = s.timecode;
-        // The library drops numbers at this rate only.
+        // The library takes drop-frame timecodes at 30000/1001 only.
         if (c.framerate.num != 30000) std::replace(timecode.begin(), timecode.end(), ';', ':');
         setOption(c, "gop_timecode", timecode);
     }
-    // Which of the tables of DNxHD it is: that of its highest quality.
-    if (s.codesFields() && is(*s.codec, "vc3venc")) c.bit_rate = s.rate.rate().ratio() > 26 ? 220e6 : 185e6;
+    // The bit rate selects the DNxHD profile: here the one of the highest quality.
+    if (s.isInterlaced() && is(*s.codec, "vc3venc")) c.bit_rate = s.rate.rate().ratio() > 26 ? 220e6 : 185e6;
     if (!s.codec->has(VideoTrait::rated)) return "";
     if (s.byQuality()) {
         setOption(c, s.codec->quality, std::to_string(s.quality));
         return "";
     }
-    const double target = s.target > 0 ? s.target : s.codec->usualBits;
+    const double target = s.bitrate > 0 ? s.bitrate : s.codec->defaultBitrate;
     if (!(target > 0)) return "Neither a quality nor a bit rate is set";
     c.bit_rate = static_cast<std::int64_t>(target);
     const bool constant = s.vbr == QvBitrate::cbr;
-    const double most = constant ? target : s.most > target ? s.most : 0;
+    const double most = constant ? target : s.maxBitrate > target ? s.maxBitrate : 0;
     const bool av1 = is(*s.codec, "av1venc");
     if (av1 && !constant && most > 0)
         qv_log()->warning("%s has no highest bit rate; only the average of %lld kbit/s is kept", name(),
                           static_cast<long long>(c.bit_rate / 1000));
     if (most > 0 && (constant || !av1)) {
         c.rc_max_rate = static_cast<std::int64_t>(most);
-        // The models of MPEG-2 at main and high level; the others get a second.
+        // VBV sizes of MPEG-2 at main and high level; for the others the bits of one second.
         const bool mpeg = is(*s.codec, "mpegvenc");
         const double buffer = !mpeg ? most : most <= 15e6 ? 1835008 : 9781248;
         c.rc_buffer_size = static_cast<int>(std::min(buffer, 2e9));
     }
     if (constant && (av1 || is(*s.codec, "mpegvenc"))) c.rc_min_rate = c.rc_max_rate;
-    // The others fill no stream up.
+    // The others never pad to a lowest bit rate.
     const bool fills = is(*s.codec, "mpegvenc") || is(*s.codec, "mpeg4venc");
-    if (!constant && fills && most > 0) c.rc_min_rate = static_cast<std::int64_t>(std::min(s.least, target));
+    if (!constant && fills && most > 0)
+        c.rc_min_rate = static_cast<std::int64_t>(std::min(s.minBitrate, target));
     return "";
 }
 
@@ -303,22 +300,23 @@ std::string VideoEnc::configurePass() {
     AVCodecContext& c = *context_;
     const bool x265 = is(*s.codec, "h265venc");
     std::string own = x265 ? "log-level=none:open-gop=0" : "";
-    // Its own pool has a thread a core otherwise, and more pictures at a time where there are more cores.
+    // Without these its pool has one thread per core, and more pictures at a time with more cores.
     if (x265 && s.threads > 0) {
         const int pictures = s.threads >= 16 ? 4 : s.threads >= 8 ? 3 : s.threads >= 4 ? 2 : 1;
         own += ":pools=" + std::to_string(s.threads) + ":frame-threads=" + std::to_string(pictures);
     }
-    if (s.passes && s.codec->has(VideoTrait::statsText | VideoTrait::statsFile)) {
+    if (s.passRecord && s.codec->has(VideoTrait::statsText | VideoTrait::statsFile)) {
         c.flags |= s.firstPass ? AV_CODEC_FLAG_PASS1 : AV_CODEC_FLAG_PASS2;
         if (s.codec->has(VideoTrait::statsFile)) {
             const std::string& name = files_.choose();
-            if (!s.firstPass && !files_.restore(*s.passes)) return "There are no statistics of a first pass";
+            if (!s.firstPass && !files_.restore(*s.passRecord))
+                return "There are no statistics of a first pass";
             if (x265)
                 own += ":pass=" + std::to_string(s.firstPass ? 1 : 2) + ":stats=" + name;
             else if (!setOption(c, "stats", name))
                 return "Out of memory";
         } else if (!s.firstPass) {
-            if (!loadPass(*s.passes, 0, statistics_)) return "There are no statistics of a first pass";
+            if (!loadPass(*s.passRecord, 0, statistics_)) return "There are no statistics of a first pass";
             c.stats_in = statistics_.data();
         }
     } else if (s.firstPass) {
@@ -333,7 +331,7 @@ bool VideoEnc::sendHead() {
     QvWire::VideoHead head{};
     head.size = sizeof head;
     head.version = QvWire::version;
-    head.codec = fourccNumber(fourccOf(c, *settings_.codec));
+    head.codec = fourccOf(c, *settings_.codec);
     const int fields = settings_.rate.interlaced();
     head.fieldOrder = static_cast<QvWire::FieldOrder>(fields);
     head.rateNum = c.time_base.den;
@@ -383,7 +381,8 @@ int VideoEnc::writeFrame(QvFrame* frame) {
     picture->interlaced_frame = settings_.rate.interlaced() != 0;
     picture->top_field_first = settings_.rate.isTopFirst();
     const int sent = avcodec_send_frame(context_.get(), picture);
-    // The library gives no code where what fills a constant rate up is larger than the buffer for a picture.
+    // The library reports no better code when the padding of a constant rate is larger than its buffer for a
+    // picture.
     if (sent == AVERROR(EPERM) && context_->rc_min_rate > 0)
         return setError(
             QvStatus::failed, "Pictures of %dx%d can't be filled up to %lld kbit/s; set a lower bit rate",
@@ -423,13 +422,13 @@ int VideoEnc::putPacket() {
     return QvStatus::ok;
 }
 
-// Statistics in files are whole when the encoder is gone.
+// Statistics in files are complete only after the encoder is destroyed.
 int VideoEnc::finishPass() {
     if (units_ == 0 && context_->stats_out) statistics_ = context_->stats_out;
     context_.reset();
     const bool kept = settings_.codec->has(VideoTrait::statsFile)
-                          ? files_.save(*settings_.passes)
-                          : !statistics_.empty() && storePass(*settings_.passes, 0, statistics_);
+                          ? files_.save(*settings_.passRecord)
+                          : !statistics_.empty() && storePass(*settings_.passRecord, 0, statistics_);
     return kept ? QvStatus::ok
                 : setError(QvStatus::failed, "The statistics of the first pass can not be kept");
 }
@@ -438,7 +437,7 @@ int VideoEnc::close() {
     if (getState() != qvStateOpen) return QvStatus::ok;
     setState(stateInitialised);
     int result = QvStatus::ok;
-    // An encoder that never had a picture has nothing that is late.
+    // An encoder that never had a picture has nothing to drain.
     if (frames_ > 0) {
         const int ended = avcodec_send_frame(context_.get(), nullptr);
         result = ended < 0 ? setError(QvStatus::failed, "The encoder failed (%s)", errorText(ended).c_str())

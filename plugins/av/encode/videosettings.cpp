@@ -31,29 +31,29 @@ constexpr Rate rates[] = {{5, 0},      {6, 0},     {7.5, 0}, {8, 0},      {9, 0}
                           {59.94, 0},  {60, 0},    {100, 0}, {119.88, 0}, {120, 0}};
 constexpr Rate mpegRates[] = {{23.976, 0}, {24, 0}, {25, 0}, {25, 1}, {25, 2},    {29.97, 0}, {29.97, 1},
                               {29.97, 2},  {30, 0}, {30, 1}, {50, 0}, {59.94, 0}, {60, 0}};
-constexpr Rate phoneRates[] = {{5, 0},  {6, 0},  {7.5, 0},    {8, 0},  {10, 0}, {12, 0},   {12.5, 0},
-                               {15, 0}, {20, 0}, {23.976, 0}, {24, 0}, {25, 0}, {29.97, 0}};
-constexpr Rate tvRates[] = {{25, 2}, {25, 0}, {29.97, 2}, {29.97, 0}};
-constexpr Rate hdTapeRates[] = {{25, 1}, {25, 0}, {29.97, 1}, {29.97, 0}, {50, 0}, {59.94, 0}};
+constexpr Rate h263Rates[] = {{5, 0},  {6, 0},  {7.5, 0},    {8, 0},  {10, 0}, {12, 0},   {12.5, 0},
+                              {15, 0}, {20, 0}, {23.976, 0}, {24, 0}, {25, 0}, {29.97, 0}};
+constexpr Rate dvRates[] = {{25, 2}, {25, 0}, {29.97, 2}, {29.97, 0}};
+constexpr Rate dv100Rates[] = {{25, 1}, {25, 0}, {29.97, 1}, {29.97, 0}, {50, 0}, {59.94, 0}};
 
-// DV of 100 Mbit/s; under one name, or as a kind of the other.
-bool isHdTape(const S& s) {
+// DV of 100 Mbit/s: a module of its own, and also a profile of the DV encoder.
+bool isDv100(const S& s) {
     const std::string_view module = s.codec->module;
     return module == "dv100venc" || (module == "dvvenc" && s.codecProfile == "100");
 }
 
 std::span<const Rate> ratesOf(const S& s) {
-    if (isHdTape(s)) return hdTapeRates;
+    if (isDv100(s)) return dv100Rates;
     if (std::strcmp(s.codec->module, "mpegvenc") == 0) return mpegRates;
-    if (std::strcmp(s.codec->module, "dvvenc") == 0) return tvRates;
-    if (std::strcmp(s.codec->encoder, "h263") == 0) return phoneRates;
+    if (std::strcmp(s.codec->module, "dvvenc") == 0) return dvRates;
+    if (std::strcmp(s.codec->encoder, "h263") == 0) return h263Rates;
     return rates;
 }
 
 void framerateRange(const S& s, Any& value) {
     AnyVector all;
     for (const Rate& row : ratesOf(s))
-        if (row.interlaced == 0 || s.takesFields()) all.append(QvFramerate(row.rate, row.interlaced));
+        if (row.interlaced == 0 || s.supportsFields()) all.append(QvFramerate(row.rate, row.interlaced));
     value = all;
 }
 
@@ -63,9 +63,9 @@ AnyDict sizePair(int w, int h) { return AnyDict("w", w, "h", h); }
 
 void sizeRange(const S& s, Any& value) {
     AnyVector sizes;
-    if (!isHdTape(s) && std::strcmp(s.codec->module, "dvvenc") == 0)
+    if (!isDv100(s) && std::strcmp(s.codec->module, "dvvenc") == 0)
         for (const int height : {576, 480}) sizes.append(sizePair(720, height));
-    if (isHdTape(s)) {
+    if (isDv100(s)) {
         sizes.append(sizePair(1440, 1080));
         sizes.append(sizePair(1280, 1080));
         sizes.append(sizePair(960, 720));
@@ -75,35 +75,36 @@ void sizeRange(const S& s, Any& value) {
     if (!sizes.empty())
         value = sizes;
     else
-        value = AnyDict("wmin", s.codec->least, "wmax", s.codec->most, "hmin", std::min(s.codec->least, 120),
-                        "hmax", s.codec->most);
+        value = AnyDict("wmin", s.codec->minSide, "wmax", s.codec->maxSide, "hmin",
+                        std::min(s.codec->minSide, 120), "hmax", s.codec->maxSide);
 }
 
-int bits(double value) { return static_cast<int>(std::min(value, 2e9)); }
+// Cut to what a parameter of 32 bits holds.
+int bitrateNumber(double bitrate) { return static_cast<int>(std::min(bitrate, 2e9)); }
 
 void bitrateRange(const S& s, Any& value) {
     AnyVector both;
     for (const int type : {QvBitrate::cbr, QvBitrate::vbr}) {
         AnyDict row("type", type);
-        row.set("range", AnyVector(bits(s.codec->lowBits), bits(s.codec->highBits)));
+        row.set("range", AnyVector(bitrateNumber(s.codec->minBitrate), bitrateNumber(s.codec->maxBitrate)));
         both.append(row);
     }
     value = both;
 }
 
-int setBits(S& s, const Any& value, double S::*member) {
+int setBitrate(S& s, const Any& value, double S::*member) {
     double wanted = 0;
     if (!qvparam::convert(value, wanted) || !(wanted >= 0) || wanted > 4e9) return QvStatus::invalidParam;
-    if (wanted > 0 && (wanted < s.codec->lowBits || wanted > s.codec->highBits))
+    if (wanted > 0 && (wanted < s.codec->minBitrate || wanted > s.codec->maxBitrate))
         return QvStatus::invalidParam;
     s.*member = wanted;
-    if (member == &S::target && wanted > 0) s.quality = -1;
+    if (member == &S::bitrate && wanted > 0) s.quality = -1;
     return QvStatus::ok;
 }
 
 int setQuality(S& s, const Any& value) {
     double wanted = 0;
-    if (!qvparam::convert(value, wanted) || !(wanted >= -1) || wanted > s.codec->mostQuality)
+    if (!qvparam::convert(value, wanted) || !(wanted >= -1) || wanted > s.codec->maxQuality)
         return QvStatus::invalidParam;
     s.quality = wanted < 0 ? -1 : wanted;
     return QvStatus::ok;
@@ -124,7 +125,7 @@ int setRate(S& s, const Any& value) {
         return QvStatus::invalidParam;
     if (wanted.interlaced() != 0 && !s.codec->has(VideoTrait::interlaced)) return QvStatus::invalidParam;
     s.rate = wanted;
-    s.rateKnown = true;
+    s.hasRate = true;
     return QvStatus::ok;
 }
 
@@ -156,17 +157,18 @@ int setStandard(S& s, const Any& value) {
     if (!row) return QvStatus::invalidParam;
     if (row == s.codec) return QvStatus::ok;
     s.codec = row;
-    // Those of the other one mean nothing here.
+    // Profile and options of the other standard mean nothing for this one.
     s.codecProfile = row->profile;
     s.profileOptions.clear();
-    s.m = std::min(s.m, row->mostM);
+    s.m = std::min(s.m, row->maxM);
     if (!row->has(VideoTrait::interlaced)) s.rate.setInterlaced(0);
-    if (s.target > 0) s.target = std::clamp(s.target, row->lowBits, row->highBits);
+    if (s.bitrate > 0) s.bitrate = std::clamp(s.bitrate, row->minBitrate, row->maxBitrate);
     if (!row->form(s.type)) s.type = row->forms.front().fourcc;
     return QvStatus::ok;
 }
 
-// One option of the library by its fixed name, checked there.
+// Sets an option that the library names `option`. `words`: the values it may have, each between spaces; "":
+// the library checks the value.
 int setNamed(const S& s, const char* option, const char* words, const Any& value, std::string& to) {
     std::string wanted;
     const AVCodec* const library = s.codec->library();
@@ -180,7 +182,8 @@ int setNamed(const S& s, const char* option, const char* words, const Any& value
     return QvStatus::ok;
 }
 
-// Names that the library finds out late. "": it is asked.
+// Profile names, each between spaces, of codecs whose libraries reject a wrong one only when they are opened.
+// "": the library can check the name at once.
 const char* profilesOf(const VideoCodec& codec) {
     const std::string_view module = codec.module;
     if (module == "h264venc") return " baseline main high high10 high422 high444 ";
@@ -209,9 +212,9 @@ int setTimecode(S& s, const Any& value) {
     return QvStatus::ok;
 }
 
-int setPasses(S& s, const Any& value) {
+int setPassRecord(S& s, const Any& value) {
     if (value.isValid() && !value.isGeneric()) return QvStatus::invalidParam;
-    s.passes = value.isValid() ? static_cast<bufstream*>(const_cast<void*>(value.asGeneric())) : nullptr;
+    s.passRecord = value.isValid() ? static_cast<bufstream*>(const_cast<void*>(value.asGeneric())) : nullptr;
     return QvStatus::ok;
 }
 
@@ -229,7 +232,7 @@ double aspectOf(const S& s) {
     return static_cast<double>(s.width) / s.height;
 }
 
-double nominalBits(const S& s) { return s.target > 0 ? s.target : s.codec->usualBits; }
+double nominalBits(const S& s) { return s.bitrate > 0 ? s.bitrate : s.codec->defaultBitrate; }
 
 template <int number>
 void fixed(const S&, Any& value) {
@@ -241,25 +244,25 @@ const Row commonRows[] = {
     {.name = "profile",
      .member = Access{setProfile, [](C s, Any& v) { v = s.profile; }},
      .flags = qvParamStored,
-     .help = "number of a preset, which sets what it stands for",
+     .help = "number of a preset; to set it sets what the preset has for this encoder",
      .type = Any::Int32},
     {.name = "pal",
      .member = Access{setPal, [](C s, Any& v) { v = s.pal ? 1 : 0; }},
      .flags = qvParamStored,
-     .help = "1: size and rate of a preset for television are those of 50 Hz",
+     .help = "size and frame rate of a television preset: 1 for 50 Hz, 0 for 60 Hz",
      .type = Any::Int32},
-    // After the rows of presets, which have one of their own.
+    // After "profile": restored later, it replaces the standard that the preset has set.
     {.name = "standard",
      .member = Access{setStandard, [](C s, Any& v) { v = s.codec->standard; }},
      .flags = qvParamStored,
-     .help = "MPEG-2 or MPEG-1, MPEG-4 or H.263, of an encoder of both",
+     .help = "for encoders of two standards: MPEG-2 or MPEG-1, MPEG-4 or H.263",
      .type = Any::String},
     {"width", &S::width, qvParamStored, 0, 16384, "", "pixels", "0: not set"},
     {"height", &S::height, qvParamStored, 0, 16384, "", "pixels", "0: not set"},
     {.name = "framerate",
      .member = Access{setRate,
                       [](C s, Any& v) {
-                          if (s.rateKnown) v = s.rate;
+                          if (s.hasRate) v = s.rate;
                       }},
      .flags = qvParamStored,
      .help = "a frame rate, or frames/s",
@@ -274,17 +277,17 @@ const Row commonRows[] = {
     {.name = "type",
      .member = Access{setType, [](C s, Any& v) { v = static_cast<int>(s.type); }},
      .flags = qvParamStored,
-     .help = "FOURCC of the frames that are taken",
+     .help = "FOURCC of the input frames",
      .type = Any::Int32},
-    {"colourMatrix", &S::matrix, qvParamStored, 0, 2, "", "", "1 BT.601, 2 BT.709; 0: by the lines"},
-    {"colourPrimaries", &S::primaries, qvParamStored, 0, 255, "", "", "code point of ITU-T H.273; 0: by the matrix"},
-    {"colourTransfer", &S::transfer, qvParamStored, 0, 255, "", "", "code point of ITU-T H.273; 0: by the matrix"},
-    {"colourSpace", &S::space, qvParamStored, 0, 255, "", "", "code point of ITU-T H.273; 0: by the matrix"},
-    {"threads", &S::threads, qvParamStored, 0, 64, "", "", "of the codec; 0: one a core"},
+    {"colourMatrix", &S::matrix, qvParamStored, 0, 2, "", "", "1 BT.601, 2 BT.709; 0: by the picture's height"},
+    {"colourPrimaries", &S::primaries, qvParamStored, 0, 255, "", "", "code point of ITU-T H.273; 0: follows colourMatrix"},
+    {"colourTransfer", &S::transfer, qvParamStored, 0, 255, "", "", "code point of ITU-T H.273; 0: follows colourMatrix"},
+    {"colourSpace", &S::space, qvParamStored, 0, 255, "", "", "code point of ITU-T H.273; 0: follows colourMatrix"},
+    {"threads", &S::threads, qvParamStored, 0, 64, "", "", "threads of the codec; 0: one per core"},
     {.name = "codecProfile",
      .member = Access{setCodecProfile, [](C s, Any& v) { v = textOf(s.codecProfile); }},
      .flags = qvParamStored,
-     .help = "the codec's own profile by the library's name",
+     .help = "the codec's profile, as the library names it",
      .type = Any::String},
     {.name = "avOptions",
      .member = Access{[](S& s, const Any& value) {
@@ -301,9 +304,9 @@ const Row commonRows[] = {
      .help = "options of the library, name=value:name=value",
      .type = Any::String},
     {.name = "meta",
-     .member = Access{setPasses, nullptr},
+     .member = Access{setPassRecord, nullptr},
      .flags = qvParamWriteOnly,
-     .help = "the record of a first pass",
+     .help = "statistics of the first pass",
      .type = Any::Generic},
     {"chapters", {}, qvParamIgnored},
     {"topFirst", {}, qvParamIgnored},
@@ -333,60 +336,62 @@ const Row commonRows[] = {
 };
 
 const Row groupRows[] = {
-    {"N", &S::n, qvParamStored, 1, 1000, "", "pictures", "from one key frame to the next at most"},
+    {"N", &S::n, qvParamStored, 1, 1000, "", "pictures",
+     "GOP length: most pictures from one key frame to the next"},
     {.name = "M",
      .member = Access{[](S& s, const Any& value) {
                           int wanted = 0;
-                          if (!qvparam::convert(value, wanted) || wanted < 1 || wanted > s.codec->mostM)
+                          if (!qvparam::convert(value, wanted) || wanted < 1 || wanted > s.codec->maxM)
                               return QvStatus::invalidParam;
                           s.m = wanted;
                           return QvStatus::ok;
                       },
                       [](C s, Any& v) { v = s.m; }},
      .flags = qvParamStored,
-     .help = "from one anchor picture to the next; 1: no B-frames",
+     .help = "distance from one I or P picture to the next; 1: no B-frames",
      .type = Any::Int32},
     {"gopRange",
      Access{nullptr,
-            [](C s, Any& v) { v = AnyDict("minM", 1, "maxM", s.codec->mostM, "minN", 1, "maxN", 1000); }}},
+            [](C s, Any& v) { v = AnyDict("minM", 1, "maxM", s.codec->maxM, "minN", 1, "maxN", 1000); }}},
 };
 
 const Row rateRows[] = {
     {"vbr", &S::vbr, qvParamStored, 0, 4, "", "", "0 constant, 1 variable"},
     {.name = "vBitrate",
-     .member = Access{[](S& s, const Any& value) { return setBits(s, value, &S::target); },
+     .member = Access{[](S& s, const Any& value) { return setBitrate(s, value, &S::bitrate); },
                       [](C s, Any& v) { v = nominalBits(s); }},
      .flags = qvParamStored,
      .unit = "bit/s",
      .type = Any::Float},
     {.name = "maxVBitrate",
-     .member = Access{[](S& s, const Any& value) { return setBits(s, value, &S::most); },
-                      [](C s, Any& v) { v = s.most > 0 ? s.most : nominalBits(s); }},
+     .member = Access{[](S& s, const Any& value) { return setBitrate(s, value, &S::maxBitrate); },
+                      [](C s, Any& v) { v = s.maxBitrate > 0 ? s.maxBitrate : nominalBits(s); }},
      .unit = "bit/s",
-     .help = "AV1 has none",
+     .help = "AV1 ignores it",
      .type = Any::Float},
-    {"minVBitrate", &S::least, qvParamStored, 0, 4e9, "", "bit/s",
-     "MPEG-1, 2 and 4 with a maximum; the others do not fill up"},
+    {"minVBitrate", &S::minBitrate, qvParamStored, 0, 4e9, "", "bit/s",
+     "MPEG-1, 2 and 4 with a maximum; the others ignore it"},
     {"bitrateRange", Access{nullptr, bitrateRange}},
-    {"vBitrateRange",
-     Access{nullptr, [](C s, Any& v) { v = AnyVector(bits(s.codec->lowBits), bits(s.codec->highBits)); }}},
+    {"vBitrateRange", Access{nullptr,
+                             [](C s, Any& v) {
+                                 v = AnyVector(bitrateNumber(s.codec->minBitrate),
+                                               bitrateNumber(s.codec->maxBitrate));
+                             }}},
     {"estimateSecKb",
      Access{nullptr, [](C s, Any& v) { v = Any(static_cast<float>(nominalBits(s) / 8000)); }}},
     {.name = "timecode",
      .member = Access{setTimecode, [](C s, Any& v) { v = textOf(s.timecode); }},
      .flags = qvParamStored,
-     .help = "of the first picture, HH:MM:SS:FF; MPEG-1 and -2 have it in each group",
+     .help = "of the first picture, HH:MM:SS:FF; MPEG-1 and -2 write it into each GOP",
      .type = Any::String},
     {"twoPass", &S::twoPass, qvParamPlain},
-    {.name = "firstPass",
-     .member = &S::firstPass,
-     .help = "1: writes statistics into the record and no stream"},
+    {.name = "firstPass", .member = &S::firstPass, .help = "1: writes statistics into meta, and no stream"},
 };
 
 const Row qualityRow = {.name = "crf",
                         .member = Access{setQuality, [](C s, Any& v) { v = s.quality; }},
                         .flags = qvParamStored,
-                        .help = "constant quality, less is better; -1: by bit rate",
+                        .help = "constant quality, lower is better; -1: by bit rate",
                         .type = Any::Float};
 const Row presetRow = {.name = "preset",
                        .member = Access{[](S& s, const Any& value) {
@@ -395,7 +400,7 @@ const Row presetRow = {.name = "preset",
                                         },
                                         [](C s, Any& v) { v = textOf(s.preset); }},
                        .flags = qvParamStored,
-                       .help = "speed against size, by the library's name",
+                       .help = "speed against size, in the library's word",
                        .type = Any::String};
 const Row tuneRow = {
     .name = "tune",
@@ -403,7 +408,7 @@ const Row tuneRow = {
         [](S& s, const Any& value) { return setNamed(s, s.codec->tune, s.codec->tuneWords, value, s.tune); },
         [](C s, Any& v) { v = textOf(s.tune); }},
     .flags = qvParamStored,
-    .help = "what the pictures are, by the library's name",
+    .help = "kind of pictures, in the library's word",
     .type = Any::String};
 
 std::vector<Row> tableOf(const VideoCodec& codec) {
@@ -421,13 +426,14 @@ std::vector<Row> tableOf(const VideoCodec& codec) {
 VideoSettings::VideoSettings(const VideoCodec& row)
     : codec(&row),
       type(row.forms.front().fourcc),
-      quality(*row.quality ? row.usualQuality : -1),
-      n(row.usualN),
-      m(row.usualM),
-      preset(row.usualPreset),
+      quality(*row.quality ? row.defaultQuality : -1),
+      n(row.defaultN),
+      m(row.defaultM),
+      preset(row.defaultPreset),
       codecProfile(row.profile) {}
 
-// Four kinds of tables are enough: what a codec has follows from its traits.
+// Three tables cover all codecs: those with constant quality, those with a bit rate only, and those with
+// neither.
 std::span<const QvParamRow<VideoSettings>> VideoSettings::rows(const VideoCodec& codec) {
     static const std::vector<Row> quality = tableOf(*videoCodec("h264venc"));
     static const std::vector<Row> rated = tableOf(*videoCodec("mpegvenc"));
@@ -435,13 +441,13 @@ std::span<const QvParamRow<VideoSettings>> VideoSettings::rows(const VideoCodec&
     return *codec.quality ? quality : codec.has(VideoTrait::rated) ? rated : plain;
 }
 
-// DNxHR has none, and the DNxHD of fields is that of broadcasting.
-bool VideoSettings::takesFields() const {
+// VC-3 has interlaced pictures of 1920x1080 in 4:2:2 only.
+bool VideoSettings::supportsFields() const {
     if (std::strcmp(codec->module, "vc3venc") != 0) return codec->has(VideoTrait::interlaced);
     return (width == 0 || (width == 1920 && height == 1080)) && type != QvFourcc::b64a;
 }
 
-bool VideoSettings::takesSize() const {
+bool VideoSettings::supportsSize() const {
     return std::strcmp(codec->encoder, "h263") != 0 ||
            std::find(std::begin(h263Sizes), std::end(h263Sizes), std::pair(width, height)) !=
                std::end(h263Sizes);
@@ -458,8 +464,8 @@ void VideoSettings::applyProfile() {
     if (row->rate > 0)
         setRate(*this, Any(QvFramerate(row->television && !pal ? 29.97 : row->rate, row->interlaced)));
     if (row->target > 0) {
-        target = row->target;
-        most = row->most;
+        bitrate = row->target;
+        maxBitrate = row->most;
         vbr = row->most > row->target ? QvBitrate::vbr : QvBitrate::cbr;
         quality = -1;
     }

@@ -1,8 +1,8 @@
 // Parameters of the video encoders.
 //
-// "type" is the FOURCC of the frames that are taken. A size of 0 and a frame rate that is not set mean those
-// of the source; both must be set before open. "frameAspect" 0 means square pixels. "crf" decides the
-// quality until a bit rate is set, and again when it is set after that.
+// "type" is the FOURCC of the input frames. Size and frame rate have no default and must be set before open.
+// "frameAspect" 0 means square pixels. "crf" selects constant quality and "vBitrate" a bit rate: the one that
+// was set last counts.
 #pragma once
 
 #include <span>
@@ -21,31 +21,34 @@ struct VideoSettings {
     const VideoCodec* codec;
     int width = 0, height = 0;
     QvFramerate rate{25.0};
-    bool rateKnown = false;
+    bool hasRate = false;
     double frameAspect = 0;
     unsigned type = 0;
     int vbr = 1;
-    double target = 0, most = 0, least = 0;  // bits a second
-    double quality = -1;                     // -1: by bit rate
-    int n = 1, m = 1;                        // pictures of a group, and from one anchor to the next
-    int threads = 0, profile = -1, matrix = 0;
-    int primaries = 0, transfer = 0, space = 0;  // code points of ITU-T H.273; 0: by the matrix
+    double bitrate = 0, maxBitrate = 0, minBitrate = 0;  // bit/s; 0: not set
+    double quality = -1;                                 // -1: by bit rate
+    int n = 1, m = 1;  // GOP length; distance from one anchor (I or P picture) to the next
+    int threads = 0;   // of the codec; 0: one per core
+    int profile = -1;  // number of a preset; -1: none
+    int matrix = 0;    // 1 BT.601, 2 BT.709; 0: by the picture's height
+    int primaries = 0, transfer = 0, space = 0;  // code points of ITU-T H.273; 0: follows `matrix`
     bool pal = true, twoPass = false, firstPass = false;
-    int topLines = 0;  // that the picture has above the shown ones
-    std::string preset, tune, codecProfile, options;
-    std::string timecode;         // of the first picture, "HH:MM:SS:FF"
-    std::string profileOptions;   // of the preset
-    bufstream* passes = nullptr;  // borrowed
+    int topLines = 0;                                 // blanking lines above the active picture: 32 in IMX
+    std::string preset, tune, codecProfile, options;  // in the library's words
+    std::string timecode;                             // of the first picture, "HH:MM:SS:FF"
+    std::string profileOptions;                       // options of the library that the preset `profile` sets
+    bufstream* passRecord = nullptr;                  // statistics of the first pass; borrowed
 
     bool byQuality() const { return quality >= 0; }
-    bool codesFields() const { return rate.interlaced() != 0; }
-    // The codec has such pictures of two fields; of a size that is not set yet, it may.
-    bool takesFields() const;
-    // Of H.263 there are five; of the others only the limits of VideoCodec count.
-    bool takesSize() const;
-    // The tables that the codec has, in the order in which they are stored and restored.
+    bool isInterlaced() const { return rate.interlaced() != 0; }
+    // Whether the codec has interlaced pictures of this size and type. True while the size is not set, if
+    // some size has them.
+    bool supportsFields() const;
+    // False for a size that H.263 lacks: it has five. The limits in VideoCodec are checked elsewhere.
+    bool supportsSize() const;
+    // The parameters that the codec has, in the order in which they are stored and restored.
     static std::span<const QvParamRow<VideoSettings>> rows(const VideoCodec& codec);
-    // What a preset stands for; what it leaves open stays.
+    // Sets what the preset `profile` sets for this codec. Other settings are unchanged.
     void applyProfile();
 };
 

@@ -25,13 +25,13 @@ namespace av {
 
 namespace {
 
-// Raw pictures that containers have words for.
+// Forms of uncompressed pictures for which containers have a code.
 struct RawForm {
     unsigned fourcc;
     AVCodecID codec;
     AVPixelFormat pixels;
-    unsigned tag;        // of the library; 0: its own choice
-    unsigned boxed = 0;  // tag in QuickTime
+    unsigned tag;  // the container's code; 0: the library chooses
+    unsigned quickTimeTag = 0;
 };
 constexpr RawForm rawForms[] = {
     {QvFourcc::I420, AV_CODEC_ID_RAWVIDEO, AV_PIX_FMT_YUV420P, MKTAG('I', '4', '2', '0')},
@@ -45,13 +45,23 @@ constexpr RawForm rawForms[] = {
     {QvFourcc::v210, AV_CODEC_ID_V210, AV_PIX_FMT_YUV422P10LE, 0},
 };
 
-bool holdsRaw(const Container& container, const RawForm& form) {
+bool holdsForm(const Container& container, const RawForm& form) {
+    if (!container.takes(MuxCodec::raw)) return false;
     const std::string_view format = container.format;
     const bool planar = form.pixels == AV_PIX_FMT_YUV420P || form.pixels == AV_PIX_FMT_YUV420P16LE;
     if (format == "yuv4mpegpipe") return planar;
     if (form.pixels == AV_PIX_FMT_YUV420P16LE) return false;
     if (format == "mov") return !planar;
     return format == "avi" || form.codec == AV_CODEC_ID_RAWVIDEO;
+}
+
+// For messages.
+std::string heldForms(const Container& container) {
+    std::string names;
+    for (const RawForm& row : rawForms)
+        if (holdsForm(container, row))
+            names += (names.empty() ? "" : ", ") + std::string(qvFourccText(row.fourcc).data());
+    return names;
 }
 
 // In the order of the profile numbers.
@@ -84,7 +94,7 @@ bool MuxTrack::fail(const std::string& why) {
     return false;
 }
 
-bool MuxTrack::choose(const MuxCodecRow* row, std::uint32_t fourcc) {
+bool MuxTrack::chooseCodec(const MuxCodecRow* row, std::uint32_t fourcc) {
     if (!parameters_) return fail("there is no memory for it");
     if (row && isSound(row->codec) == video_)
         return fail(std::string(row->name) + " is no codec of " + (video_ ? "pictures" : "sound"));
@@ -101,9 +111,9 @@ bool MuxTrack::choose(const MuxCodecRow* row, std::uint32_t fourcc) {
     return true;
 }
 
-bool MuxTrack::setOwnData(const void* data, std::uint64_t bytes) {
+bool MuxTrack::setExtradata(const void* data, std::uint64_t bytes) {
     if (!data || bytes == 0) return true;
-    if (bytes > limits::allocation / 16) return fail("the codec's own data are too long");
+    if (bytes > limits::allocation / 16) return fail("the extradata of its codec are too long");
     auto* const copy = static_cast<std::uint8_t*>(av_mallocz(bytes + AV_INPUT_BUFFER_PADDING_SIZE));
     if (!copy) return fail("there is no memory for it");
     std::memcpy(copy, data, bytes);
@@ -116,12 +126,12 @@ bool MuxTrack::setOwnData(const void* data, std::uint64_t bytes) {
 // --- Heads.
 
 bool MuxTrack::describe(const QvWire::VideoHead& head) {
-    if (described()) return setOwnData(head.extradata, head.extradataBytes);
+    if (described()) return setExtradata(head.extradata, head.extradataBytes);
     if (head.rateNum < 1 || head.rateDen < 1) return fail("it has no frame rate");
     if (head.width < 1 || head.height < 1 || head.width > limits::side || head.height > limits::side)
         return fail("there are no pictures of " + std::to_string(head.width) + "x" +
                     std::to_string(head.height));
-    if (!choose(muxCodec(head.codec), head.codec)) return false;
+    if (!chooseCodec(muxCodec(head.codec), head.codec)) return false;
     if (head.delay > 0 && (container_->inOrder & codecBit(codec_->codec)) != 0)
         return fail(std::string(container_->module().displayName) +
                     " does not hold the order of B-frames of " + codec_->name + "; encode without them");
@@ -136,27 +146,30 @@ bool MuxTrack::describe(const QvWire::VideoHead& head) {
     to.field_order = head.fieldOrder == QvWire::FieldOrder::topFirst      ? AV_FIELD_TT
                      : head.fieldOrder == QvWire::FieldOrder::bottomFirst ? AV_FIELD_BB
                                                                           : AV_FIELD_PROGRESSIVE;
-    to.color_primaries = static_cast<AVColorPrimaries>(head.primaries ? head.primaries : 2);
-    to.color_trc = static_cast<AVColorTransferCharacteristic>(head.transfer ? head.transfer : 2);
+    to.color_primaries =
+        head.primaries ? static_cast<AVColorPrimaries>(head.primaries) : AVCOL_PRI_UNSPECIFIED;
+    to.color_trc =
+        head.transfer ? static_cast<AVColorTransferCharacteristic>(head.transfer) : AVCOL_TRC_UNSPECIFIED;
     to.color_space = static_cast<AVColorSpace>(head.matrix);
     to.color_range = head.fullRange ? AVCOL_RANGE_JPEG : AVCOL_RANGE_MPEG;
     to.video_delay = std::max(head.delay, 0);
     to.profile = head.profile >= 0 ? head.profile : FF_PROFILE_UNKNOWN;
     to.level = head.level >= 0 ? head.level : FF_LEVEL_UNKNOWN;
     chooseTag(head.profile);
-    // Own data in the form of a container don't fit to units in elementary form.
-    const bool boxed = (codec_->codec == MuxCodec::h264 || codec_->codec == MuxCodec::hevc) &&
-                       head.extradataBytes > 0 && head.extradata &&
-                       *static_cast<const std::uint8_t*>(head.extradata) == 1;
-    if (!boxed && !setOwnData(head.extradata, head.extradataBytes)) return false;
+    // Extradata that begin with a 1 are the record of a container (avcC, hvcC), which does not fit units in
+    // elementary form.
+    const bool isRecord = (codec_->codec == MuxCodec::h264 || codec_->codec == MuxCodec::hevc) &&
+                          head.extradataBytes > 0 && head.extradata &&
+                          *static_cast<const std::uint8_t*>(head.extradata) == 1;
+    if (!isRecord && !setExtradata(head.extradata, head.extradataBytes)) return false;
     awaitsUnit_ = (codec_->setsInBand && container_->is(MuxTrait::lengths) && to.extradata_size == 0) ||
                   container_->is(MuxTrait::pixels);
-    return makeFilter();
+    return makeUnitFilter();
 }
 
 void MuxTrack::chooseTag(int profile) {
-    const bool boxes = container_->is(MuxTrait::indexInFront);
-    if (codec_->codec == MuxCodec::hevc && boxes)
+    const bool quickTime = container_->is(MuxTrait::indexInFront);  // or MP4, which is based on it
+    if (codec_->codec == MuxCodec::hevc && quickTime)
         parameters_->codec_tag = MKTAG('h', 'v', 'c', '1');
     else if (codec_->codec == MuxCodec::prores && profile >= 0 &&
              profile < static_cast<int>(std::size(proresTags)))
@@ -165,16 +178,16 @@ void MuxTrack::chooseTag(int profile) {
 
 bool MuxTrack::describe(const QvWire::AudioHead& head) {
     if (described()) {
-        trailing_ = std::max(head.trailingPadding, 0);
+        trailingPadding_ = std::max(head.trailingPadding, 0);
         const auto* const data = static_cast<const std::uint8_t*>(head.extradata);
-        if (data && codec_->codec == MuxCodec::flac) changed_.assign(data, data + head.extradataBytes);
+        if (data && codec_->codec == MuxCodec::flac) newExtradata_.assign(data, data + head.extradataBytes);
         return true;
     }
     if (head.rate < 1 || head.rate > limits::samplerate || head.channels < 1 ||
         head.channels > limits::channels)
         return fail("there is no sound of " + std::to_string(head.rate) + " Hz and " +
                     std::to_string(head.channels) + " channels");
-    if (!choose(muxCodec(head.codec), head.codec)) return false;
+    if (!chooseCodec(muxCodec(head.codec), head.codec)) return false;
     const MuxerModule& module = container_->module();
     if (module.samplerate > 0 && head.rate != module.samplerate)
         return fail(std::string(module.displayName) + " holds sound of " + std::to_string(module.samplerate) +
@@ -189,13 +202,13 @@ bool MuxTrack::describe(const QvWire::AudioHead& head) {
     to.bits_per_raw_sample = head.bits;
     to.frame_size = std::max(head.frameSize, 0);
     to.initial_padding = std::max(head.initialPadding, 0);
-    to.trailing_padding = trailing_ = std::max(head.trailingPadding, 0);
+    to.trailing_padding = trailingPadding_ = std::max(head.trailingPadding, 0);
     to.bit_rate = std::max(head.bitrate, 0);
     to.profile = head.profile >= 0 ? head.profile : FF_PROFILE_UNKNOWN;
     if (codec_->codec == MuxCodec::pcm) choosePcm(head.bits);
-    if (!setOwnData(head.extradata, head.extradataBytes)) return false;
+    if (!setExtradata(head.extradata, head.extradataBytes)) return false;
     awaitsUnit_ = codec_->setsInBand && container_->is(MuxTrait::lengths) && to.extradata_size == 0;
-    return makeFilter();
+    return makeUnitFilter();
 }
 
 void MuxTrack::choosePcm(int bits) {
@@ -214,25 +227,28 @@ void MuxTrack::choosePcm(int bits) {
 
 bool MuxTrack::describeRaw(const QvCodec& encoder) {
     raw_ = true;
-    if (!video_) {
-        QvWire::AudioHead head{};
-        head.codec = qvFourcc("PCM ");
-        head.rate = intParam(encoder, "samplerate", 0);
-        head.channels = intParam(encoder, "channels", 0);
-        head.bits = intParam(encoder, "bitsPerSample", 0);
-        head.profile = -1;
-        return describe(head);
-    }
+    return video_ ? describeRawPictures(encoder) : describeRawSound(encoder);
+}
+
+bool MuxTrack::describeRawSound(const QvCodec& encoder) {
+    QvWire::AudioHead head{};
+    head.codec = qvFourcc("PCM ");
+    head.rate = intParam(encoder, "samplerate", 0);
+    head.channels = intParam(encoder, "channels", 0);
+    head.bits = intParam(encoder, "bitsPerSample", 0);
+    head.profile = -1;
+    return describe(head);
+}
+
+bool MuxTrack::describeRawPictures(const QvCodec& encoder) {
     const auto type = static_cast<unsigned>(intParam(encoder, "type", 0));
     const auto* const form = std::find_if(std::begin(rawForms), std::end(rawForms),
                                           [type](const RawForm& row) { return row.fourcc == type; });
-    std::string forms;
-    for (const RawForm& row : rawForms)
-        if (holdsRaw(*container_, row) && container_->takes(MuxCodec::raw))
-            forms += (forms.empty() ? "" : ", ") + std::string(qvFourccText(row.fourcc).data());
-    if (form == std::end(rawForms) || !holdsRaw(*container_, *form) || !container_->takes(MuxCodec::raw))
+    if (form == std::end(rawForms) || !holdsForm(*container_, *form)) {
+        const std::string held = heldForms(*container_);
         return fail(std::string(container_->module().displayName) + " does not hold raw pictures " +
-                    qvFourccText(type).data() + (forms.empty() ? "" : ", but " + forms));
+                    qvFourccText(type).data() + (held.empty() ? "" : ", but " + held));
+    }
     const Any rate = encoder.getParam("framerate");
     const QvRatio ratio = rate.isFramerate() ? rate.asFramerate().rate() : QvRatio(0, 1);
     if (ratio.num < 1 || ratio.den < 1) return fail("it has no frame rate");
@@ -247,8 +263,8 @@ bool MuxTrack::describeRaw(const QvCodec& encoder) {
     pictureBytes_ = frame.total_bytes();
     codec_ = &muxCodecRow(MuxCodec::raw);
     to.codec_id = container_->is(MuxTrait::wrapsPictures) ? AV_CODEC_ID_WRAPPED_AVFRAME : form->codec;
-    const bool boxes = container_->is(MuxTrait::indexInFront);
-    to.codec_tag = container_->is(MuxTrait::wrapsPictures) ? 0 : boxes ? form->boxed : form->tag;
+    const bool quickTime = container_->is(MuxTrait::indexInFront);
+    to.codec_tag = container_->is(MuxTrait::wrapsPictures) ? 0 : quickTime ? form->quickTimeTag : form->tag;
     to.format = form->pixels;
     rate_ = {static_cast<int>(ratio.num), static_cast<int>(ratio.den)};
     timeBase_ = {rate_.den, rate_.num};
@@ -259,8 +275,9 @@ bool MuxTrack::describeRaw(const QvCodec& encoder) {
 
 // --- Units.
 
-// Parameter sets leave the units where the header has them; ADTS headers likewise.
-bool MuxTrack::makeFilter() {
+// The filter removes parameter sets or ADTS headers from the units where they belong into the container's
+// header, or reports the parameter sets of the first unit for it.
+bool MuxTrack::makeUnitFilter() {
     const char* name = nullptr;
     const char* options = nullptr;
     const MuxCodec codec = codec_->codec;
@@ -283,12 +300,13 @@ bool MuxTrack::makeFilter() {
            fail("units of " + std::string(codec_->name) + " can't be converted: " + errorText(result));
 }
 
-// What the header needs from the first unit.
-bool MuxTrack::learn(AVPacket& unit) {
+// Takes what the container's header needs from a unit: extradata that the filter has found, and the pixel
+// format.
+bool MuxTrack::completeFrom(AVPacket& unit) {
     std::size_t bytes = 0;
     const std::uint8_t* const data = av_packet_get_side_data(&unit, AV_PKT_DATA_NEW_EXTRADATA, &bytes);
     if (data) {
-        if (parameters_->extradata_size == 0 && !setOwnData(data, bytes)) return false;
+        if (parameters_->extradata_size == 0 && !setExtradata(data, bytes)) return false;
         av_packet_free_side_data(&unit);
     }
     if (!awaitsUnit_) return true;
@@ -302,31 +320,37 @@ bool MuxTrack::learn(AVPacket& unit) {
     return true;
 }
 
+bool MuxTrack::hasValidTimes(const AVPacket& unit) {
+    constexpr std::int64_t farthest = 1LL << 48;  // sums of times can't overflow
+    const std::int64_t first = video_ ? -farthest : -std::int64_t{parameters_->initial_padding};
+    if (unit.pts < first || unit.pts > farthest || unit.dts < -farthest || unit.duration < 0)
+        return fail("a unit has the time " + std::to_string(unit.pts));
+    if (video_ && (unit.pts < unit.dts || (lastDts_ != AV_NOPTS_VALUE && unit.dts <= lastDts_)))
+        return fail("a unit is to be decoded at " + std::to_string(unit.dts) + ", out of order");
+    return true;
+}
+
 bool MuxTrack::take(PacketPtr unit, std::vector<PacketPtr>& out) {
-    if (unit->pts == AV_NOPTS_VALUE) unit->pts = unit->dts = next_;
-    if ((!video_ && unit->pts < -std::int64_t{parameters_->initial_padding}) || unit->dts < -(1LL << 48) ||
-        unit->pts < -(1LL << 48) || unit->pts > 1LL << 48 || unit->duration < 0)
-        return fail("a unit has the time " + std::to_string(unit->pts));
-    if (video_ && (unit->pts < unit->dts || (last_ != AV_NOPTS_VALUE && unit->dts <= last_)))
-        return fail("a unit is to be decoded at " + std::to_string(unit->dts) + ", out of order");
-    last_ = unit->dts;
-    next_ = std::max(next_, unit->pts + unit->duration);
+    if (unit->pts == AV_NOPTS_VALUE) unit->pts = unit->dts = nextTime_;
+    if (!hasValidTimes(*unit)) return false;
+    lastDts_ = unit->dts;
+    nextTime_ = std::max(nextTime_, unit->pts + unit->duration);
     if (parameters_->codec_id == AV_CODEC_ID_WRAPPED_AVFRAME && !wrap(*unit)) return false;
     if (!video_ && codec_->codec == MuxCodec::pcm && container_->is(MuxTrait::bigPcm))
-        return takeBigPcm(*unit, out);
-    if (!filter_) return learn(*unit) && pass(std::move(unit), out);
+        return takeBigEndianPcm(*unit, out);
+    if (!filter_) return completeFrom(*unit) && deliver(std::move(unit), out);
     int result = av_bsf_send_packet(filter_.get(), unit.get());
     while (result >= 0) {
         PacketPtr made(av_packet_alloc());
         if (!made) return fail("there is no memory for a unit");
         result = av_bsf_receive_packet(filter_.get(), made.get());
         if (result == AVERROR(EAGAIN) || result == AVERROR_EOF) return true;
-        if (result >= 0 && !(learn(*made) && pass(std::move(made), out))) return false;
+        if (result >= 0 && !(completeFrom(*made) && deliver(std::move(made), out))) return false;
     }
     return fail(std::string("a unit is no ") + codec_->name + ": " + errorText(result));
 }
 
-// The library's form of pictures that are not coded: the data of the unit is a frame.
+// Puts an uncompressed picture into the form of AV_CODEC_ID_WRAPPED_AVFRAME: the packet's data is an AVFrame.
 bool MuxTrack::wrap(AVPacket& unit) {
     FramePtr frame(av_frame_alloc());
     if (!frame) return fail("there is no memory for a picture");
@@ -350,8 +374,8 @@ bool MuxTrack::wrap(AVPacket& unit) {
     return true;
 }
 
-// In pieces that fit into the buffer of a player of program streams, high bytes first.
-bool MuxTrack::takeBigPcm(AVPacket& unit, std::vector<PacketPtr>& out) {
+// Big-endian samples, in packets that are short enough for the audio buffer of a program stream's player.
+bool MuxTrack::takeBigEndianPcm(AVPacket& unit, std::vector<PacketPtr>& out) {
     constexpr int mostBytes = 1920;
     const int width = sampleBytes_ / std::max(parameters_->ch_layout.nb_channels, 1);
     const int step = std::max(mostBytes / sampleBytes_, 1) * sampleBytes_;
@@ -365,21 +389,22 @@ bool MuxTrack::takeBigPcm(AVPacket& unit, std::vector<PacketPtr>& out) {
         part->size = std::min(step, unit.size - at);
         part->pts = part->dts = unit.pts + at / sampleBytes_;
         part->duration = part->size / sampleBytes_;
-        if (!pass(std::move(part), out)) return false;
+        if (!deliver(std::move(part), out)) return false;
     }
     return true;
 }
 
-bool MuxTrack::pass(PacketPtr unit, std::vector<PacketPtr>& out) {
-    if (!video_) return hold(std::move(unit), out);
+bool MuxTrack::deliver(PacketPtr unit, std::vector<PacketPtr>& out) {
+    if (!video_) return holdBack(std::move(unit), out);
     out.push_back(std::move(unit));
     return true;
 }
 
-// The last units of sound may be heard in part only, or not at all, which is known at the end.
-bool MuxTrack::hold(PacketPtr unit, std::vector<PacketPtr>& out) {
+// Keeps the last units of sound until finish(): only then is it known how many samples at the end are
+// padding.
+bool MuxTrack::holdBack(PacketPtr unit, std::vector<PacketPtr>& out) {
     if (container_->is(MuxTrait::counted) && unit->pts + unit->duration <= 0) return true;
-    constexpr std::size_t most = 3;
+    constexpr std::size_t most = 3;  // units that padding can reach
     held_.push_back(std::move(unit));
     if (held_.size() > most) {
         out.push_back(std::move(held_.front()));
@@ -390,29 +415,31 @@ bool MuxTrack::hold(PacketPtr unit, std::vector<PacketPtr>& out) {
 
 bool MuxTrack::finish(std::vector<PacketPtr>& out) {
     if (held_.empty()) return true;
-    std::int64_t silent = trailing_;
-    for (; held_.size() > 1 && silent > 0 && silent >= held_.back()->duration; held_.pop_back())
-        silent -= held_.back()->duration;
+    std::int64_t padding = trailingPadding_;
+    for (; held_.size() > 1 && padding > 0 && padding >= held_.back()->duration; held_.pop_back())
+        padding -= held_.back()->duration;
     AVPacket& last = *held_.back();
-    if (silent > 0 && silent < last.duration) {
-        last.duration -= silent;
+    if (padding > 0 && padding < last.duration) {
+        last.duration -= padding;
+        // Samples to skip at the start and at the end, 32 bits each, then a reason for either.
         std::uint8_t* const skip = av_packet_new_side_data(&last, AV_PKT_DATA_SKIP_SAMPLES, 10);
         if (!skip) return fail("there is no memory for a unit");
         std::memset(skip, 0, 10);
-        for (int i = 0; i < 4; ++i) skip[4 + i] = static_cast<std::uint8_t>(silent >> 8 * i);
+        AV_WL32(skip + 4, static_cast<std::uint32_t>(padding));
     }
     for (PacketPtr& unit : held_) out.push_back(std::move(unit));
     held_.clear();
-    return changed_.empty() || addOwnData(out);
+    return newExtradata_.empty() || addExtradataUpdate(out);
 }
 
-bool MuxTrack::addOwnData(std::vector<PacketPtr>& out) {
+// An empty unit that hands the new extradata to the multiplexer.
+bool MuxTrack::addExtradataUpdate(std::vector<PacketPtr>& out) {
     PacketPtr unit(av_packet_alloc());
     std::uint8_t* const data =
-        unit ? av_packet_new_side_data(unit.get(), AV_PKT_DATA_NEW_EXTRADATA, changed_.size()) : nullptr;
+        unit ? av_packet_new_side_data(unit.get(), AV_PKT_DATA_NEW_EXTRADATA, newExtradata_.size()) : nullptr;
     if (!data) return fail("there is no memory for a unit");
-    std::memcpy(data, changed_.data(), changed_.size());
-    unit->pts = unit->dts = next_;
+    std::memcpy(data, newExtradata_.data(), newExtradata_.size());
+    unit->pts = unit->dts = nextTime_;
     out.push_back(std::move(unit));
     return true;
 }

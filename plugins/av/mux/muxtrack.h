@@ -1,5 +1,5 @@
-// One stream of a film: what its head says in the libraries' terms, and its units in the form of the
-// container.
+// One stream of a film that is multiplexed: its description as the libraries want it (AVCodecParameters), and
+// its units converted to the form that the container holds.
 #pragma once
 
 #include <cstdint>
@@ -16,22 +16,24 @@ class QvCodec;
 
 namespace av {
 
-// A track is described by its head, or by the parameters of an encoder of raw data. It is ready when all is
-// known that the container's header needs; some of it may have to come from the first unit.
+// A track is described by its head, or by the parameters of an encoder of raw data. It is ready when
+// everything is known that the container's header needs; for some codecs that takes the first unit.
 class MuxTrack {
   public:
     MuxTrack(const Container& container, bool video, std::string place);
     MuxTrack(MuxTrack&&) noexcept;
     ~MuxTrack();
 
-    // All: false, with a text in problem(), for what the container does not take.
+    // Each returns false, with a text in problem(), for a stream that the container does not hold. A second
+    // head updates the extradata, and for sound the trailing padding.
     bool describe(const QvWire::VideoHead& head);
-    bool describe(const QvWire::AudioHead& head);  // a second one has the codec's own data as they became
-    bool describeRaw(const QvCodec& encoder);      // by "type", "width", "samplerate", ...
+    bool describe(const QvWire::AudioHead& head);
+    bool describeRaw(const QvCodec& encoder);  // by "type", "width", "samplerate", ...
 
-    // Takes a unit whose times are in timeBase(); appends what the container gets to `out`.
+    // Takes a unit whose times are in timeBase(); appends the units that are ready for the container to
+    // `out`. False with problem().
     bool take(PacketPtr unit, std::vector<PacketPtr>& out);
-    // The end: what was held, and its trailing silence cut.
+    // At the end: appends the units that were held back, without the trailing padding.
     bool finish(std::vector<PacketPtr>& out);
 
     bool video() const { return video_; }
@@ -61,7 +63,7 @@ class MuxTrack {
     const Container* container_;
     bool video_;
     bool raw_ = false;
-    bool awaitsUnit_ = false;
+    bool awaitsUnit_ = false;  // the header needs something of the first unit
     std::string place_, problem_;
     const MuxCodecRow* codec_ = nullptr;
     std::unique_ptr<AVCodecParameters, Free> parameters_;
@@ -69,24 +71,27 @@ class MuxTrack {
     AVRational timeBase_{0, 1}, rate_{0, 1}, aspect_{0, 1};
     int sampleBytes_ = 0;
     std::int64_t pictureBytes_ = 0;
-    std::int64_t last_ = INT64_MIN;      // decoding time of the last unit
-    std::int64_t next_ = 0;              // time of a unit that has none
-    int trailing_ = 0;                   // samples that are not heard at the end
-    std::vector<PacketPtr> held_;        // the last units of sound
-    std::vector<std::uint8_t> changed_;  // the codec's own data, where they were sent again
+    std::int64_t lastDts_ = AV_NOPTS_VALUE;   // of the last unit
+    std::int64_t nextTime_ = 0;               // for a unit that has no time
+    int trailingPadding_ = 0;                 // samples after the end of the sound
+    std::vector<PacketPtr> held_;             // see holdBack
+    std::vector<std::uint8_t> newExtradata_;  // from a second head
 
     bool fail(const std::string& why);
-    bool choose(const MuxCodecRow* row, std::uint32_t fourcc);
-    bool setOwnData(const void* data, std::uint64_t bytes);
-    bool makeFilter();
+    bool chooseCodec(const MuxCodecRow* row, std::uint32_t fourcc);
+    bool describeRawSound(const QvCodec& encoder);
+    bool describeRawPictures(const QvCodec& encoder);
+    bool setExtradata(const void* data, std::uint64_t bytes);
+    bool makeUnitFilter();
     void choosePcm(int bits);
     void chooseTag(int profile);
-    bool learn(AVPacket& unit);
+    bool completeFrom(AVPacket& unit);
+    bool hasValidTimes(const AVPacket& unit);
     bool wrap(AVPacket& unit);
-    bool takeBigPcm(AVPacket& unit, std::vector<PacketPtr>& out);
-    bool pass(PacketPtr unit, std::vector<PacketPtr>& out);
-    bool hold(PacketPtr unit, std::vector<PacketPtr>& out);
-    bool addOwnData(std::vector<PacketPtr>& out);
+    bool takeBigEndianPcm(AVPacket& unit, std::vector<PacketPtr>& out);
+    bool deliver(PacketPtr unit, std::vector<PacketPtr>& out);
+    bool holdBack(PacketPtr unit, std::vector<PacketPtr>& out);
+    bool addExtradataUpdate(std::vector<PacketPtr>& out);
 };
 
 }  // namespace av

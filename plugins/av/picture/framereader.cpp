@@ -25,9 +25,9 @@ constexpr int longestStepOfBroadcast = 10;  // seconds
 constexpr int longestStepOfFile = 30 * 60 * 60;
 constexpr int mostStarts = 8;  // failed starts for one picture; then only the first packet is tried
 
-// Whether pictures that are not referred to are presented as soon as they are decoded, so that the order of
-// presentation follows from the times of decoding.
-bool refersToNeighbours(AVCodecID codec) {
+// Whether B-frames are always shown as soon as they are decoded, so that the order of presentation follows
+// from the order of decoding.
+bool hasSimpleReordering(AVCodecID codec) {
     return codec == AV_CODEC_ID_MPEG1VIDEO || codec == AV_CODEC_ID_MPEG2VIDEO || codec == AV_CODEC_ID_MPEG4 ||
            codec == AV_CODEC_ID_VC1;
 }
@@ -36,8 +36,8 @@ Rational rational(AVRational r) { return {r.num, r.den}; }
 
 }  // namespace
 
-// A presentation number counts pictures in the order in which they are shown, a packet number those of the
-// index.
+// Decodes the pictures by number. The presentation number counts them in the order in which they are shown,
+// from 0; packets are numbered as in the index, in decoding order.
 class FrameReader::Decoding {
   public:
     explicit Decoding(std::unique_ptr<DecodedPictures> source)
@@ -49,7 +49,7 @@ class FrameReader::Decoding {
     Read show(std::size_t wanted, std::string& failure);
     const AVFrame& picture() const { return *held_; }
     const AVFrame& first() const { return *coming_; }  // after begin()
-    // In units of the time base.
+    // Of picture 0, in units of the stream's time base.
     std::int64_t firstTime() const { return hasTimes() ? pictures_.front().time : 0; }
     // Whether the reader's frame already has the picture, as when it is shown again.
     bool isWritten() const { return written_ == heldNumber_; }
@@ -69,14 +69,15 @@ class FrameReader::Decoding {
   private:
     std::unique_ptr<DecodedPictures> source_;
     std::vector<TimedPicture> pictures_;
-    std::vector<std::size_t> number_;  // of a packet: its presentation number, or notShown
+    std::vector<std::size_t> number_;  // of a packet: the presentation number of its picture, or notShown
     std::vector<bool> noStart_;  // of a packet: decoding can't start there, even if it is flagged as key
     std::vector<bool> counted_;  // of a presentation number: concealed_ includes it
     PicturePlan plan_;
-    FramePtr held_, coming_;
+    FramePtr held_;    // what picture() returns
+    FramePtr coming_;  // the picture after it, already decoded
     std::optional<std::size_t> heldNumber_, comingNumber_, written_;
     std::size_t startedAt_ = 0;  // packet
-    bool checkStart_ = false;    // the next picture shows whether decoding could start there
+    bool checkStart_ = false;    // the next picture will show whether decoding could start at startedAt_
     bool ended_ = false;
     int concealed_ = 0;
 
@@ -98,15 +99,15 @@ bool FrameReader::Decoding::hasTimes() const {
     const AVCodecDescriptor* const codec = avcodec_descriptor_get(source_->codec().codec_id);
     if (!codec || !(codec->props & AV_CODEC_PROP_REORDER)) return true;
     const auto& packets = source_->packets();
-    const auto without = static_cast<std::size_t>(
+    const auto untimed = static_cast<std::size_t>(
         std::count_if(packets.begin(), packets.end(),
                       [](const IndexedPacket& packet) { return packet.pts == AV_NOPTS_VALUE; }));
-    // Without a container all times are guesses as soon as one is missing.
+    // Without a container the library has guessed all times if one is missing.
     const bool bare = (source_->container().iformat->flags & AVFMT_GENERIC_INDEX) != 0;
-    return without == 0 || (!bare && refersToNeighbours(source_->codec().codec_id));
+    return untimed == 0 || (!bare && hasSimpleReordering(source_->codec().codec_id));
 }
 
-// Without times only the codec knows the order of presentation, so the whole stream is decoded once.
+// Without times only the codec knows the order of presentation: decodes the whole stream once to find it.
 bool FrameReader::Decoding::decodeOrder(std::string& reason) {
     pictures_.clear();
     while (true) {
@@ -128,9 +129,9 @@ bool FrameReader::Decoding::isSecondField(std::size_t packet) const {
 }
 
 // In transport streams each field of a picture can be a packet of its own, the second without a position in
-// the file. The first decoded pictures show whether that is so here.
+// the file. Some pictures are decoded to see whether that is so here.
 bool FrameReader::Decoding::dropSecondFields() {
-    constexpr int enough = 8;
+    constexpr int enough = 8;  // decoded pictures
     const AVFieldOrder order = source_->stream().codecpar->field_order;
     if (source_->codec().codec_id != AV_CODEC_ID_H264 || order == AV_FIELD_PROGRESSIVE) return true;
     bool any = false;
@@ -295,7 +296,8 @@ FrameReader::Read FrameReader::Decoding::show(std::size_t wanted, std::string& f
     for (int dropped = 0;;) {
         if (const Read result = advance(wanted, dropped, failure); result != Read::end) return result;
         if (startedAt_ > 0 && !counted_[wanted] && startFor(wanted) == startedAt_) {
-            // It may be lost because decoding began at that key, and not from a key before it.
+            // The picture may be missing only because decoding started at this key picture and not at an
+            // earlier one.
             dropStart(dropped);
             heldNumber_.reset();
             comingNumber_.reset();
@@ -304,7 +306,7 @@ FrameReader::Read FrameReader::Decoding::show(std::size_t wanted, std::string& f
         conceal(wanted);
         if (heldNumber_) return Read::picture;
         if (startedAt_ == 0) break;
-        // That start gave no earlier picture either: the one to show instead lies before the start.
+        // The picture before it is shown instead, but it has to be decoded from an earlier start.
         dropStart(dropped);
     }
     failure = "its pictures can't be decoded";
@@ -379,7 +381,7 @@ bool FrameReader::describe(bool upright) {
     return true;
 }
 
-// From here on frames are turned as the film is to be shown, if their layout allows it.
+// Rotates all pictures as the film's display matrix says, if their pixel format allows it.
 void FrameReader::turnUpright() {
     auto turner = std::make_unique<PictureTurner>(format_.turn);
     const AVFrame* const first = turner->turn(decoding_->first());

@@ -1,38 +1,31 @@
 // The samples of one sound stream as integers, from any sample on, the same whether they are reached by
 // reading from the start or by a seek.
 //
-// Sample 0 is at the film's time zero: the first presented picture, edit lists obeyed. Sound before it is
-// dropped, and silence precedes sound that starts later. Without a picture it is the stream's first sample
-// after priming. Gaps in the times of packets are filled with silence, overlaps are cut.
+// Sample 0 is at the time of the film's first picture (with its edit list applied). Earlier sound is dropped;
+// before sound that starts later there is silence. In a film without pictures sample 0 is the stream's first
+// sample after priming. Gaps in the times of packets are filled with silence, overlaps are cut.
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 #include <memory>
 #include <string>
 #include <vector>
 
 #include "plugins/av/index/packetindex.h"
+#include "plugins/av/sound/soundformat.h"
 
 class QvPcm;
 
 namespace av {
 
-struct SoundFormat {
-    int samplerate = 0;      // Hz
-    int channels = 0;        // 1 to 64
-    std::uint64_t mask = 0;  // the library's channel layout; 0: unknown
-    int bits = 0;            // 8 (unsigned), 16 or 24 (three bytes); float and 32 bits are rounded to 24
-    long long samples = 0;   // exact
-    std::string codec;       // as people know it: "AAC", "PCM", "MP3"
-    int bitrate = 0;         // kilobits a second; 0: unknown
-    std::string lost;        // why the sound ends before the stream does; "": it does not
-};
+class DecodedSamples;
 
 class SampleReader {
   public:
-    // `zero`: the film's time zero in seconds as a fraction of `zeroBase` units; `hasZero` false without a
-    // picture. Null with `reason`, a part of a sentence, for a codec that is not there and for forms beyond
-    // the limits.
+    // The film's first picture is at `zero` / `zeroBase` seconds; `hasZero` is false if it has none. Null
+    // with `reason`, a part of a sentence, for a codec without a decoder, for formats beyond the limits
+    // (source/limits.h), and for a stream without a sample in the film.
     static std::unique_ptr<SampleReader> open(const MediaBytes& bytes, const std::string& format, int stream,
                                               std::shared_ptr<const PacketIndex> index, bool hasZero,
                                               std::int64_t zero, std::int64_t zeroBase, std::string& reason);
@@ -43,28 +36,27 @@ class SampleReader {
     const SoundFormat& format() const { return format_; }
     // The next read starts at `sample`, 0 to format().samples. Cheap: the work is done by the read.
     bool seek(long long sample);
-    // Puts up to `count` samples into `to`, which has room for them and this format, replacing what it had.
-    // The number is smaller at the end only. -1 with failure().
+    // Replaces the content of `to`, which has this format and room for `count` samples. Returns how many it
+    // got: fewer than `count` at the end only. -1: see failure().
     int read(QvPcm& to, int count);
     const std::string& failure() const { return failure_; }
-    long long concealed() const {
-        return concealed_;
-    }  // packets that could not be decoded and became silence
+    // Packets so far that could not be decoded and became silence.
+    long long concealed() const { return concealed_; }
 
   private:
-    class Decoding;
-    std::unique_ptr<Decoding> decoding_;
+    std::unique_ptr<DecodedSamples> decoded_;
     SoundFormat format_;
     std::string failure_;
     long long concealed_ = 0;
-    long long next_ = 0;  // sample
-    bool moved_ = true;   // decoding does not continue where it was
-    bool ended_ = false;
-    long long blockAt_ = 0;  // place of what is decoded, and not all delivered
-    std::vector<unsigned char> block_;
+    long long next_ = 0;                // sample that is read next
+    bool restart_ = true;               // decoding starts again at next_
+    bool ended_ = false;                // there is no block after block_
+    long long blockAt_ = 0;             // sample of the film with which block_ begins
+    std::vector<unsigned char> block_;  // decoded samples
 
     SampleReader();
     bool fetch();
+    std::size_t sampleBytes() const;  // all channels
 };
 
 }  // namespace av

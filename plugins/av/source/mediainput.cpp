@@ -16,8 +16,8 @@ namespace {
 
 constexpr int bufferBytes = 64 * 1024;
 
-// The library's names of the containers. Those that open further files by names in the file (playlists,
-// concatenations) are left out.
+// The library's names of the containers that are allowed. Those that refer to other files (playlists,
+// concatenations) are not.
 constexpr const char* containers =
     "mov,mp4,matroska,webm,avi,mxf,mpegts,mpeg,mpegvideo,dv,gxf,ogg,flv,yuv4mpegpipe,asf,nut,ivf,wtv,"
     "h264,hevc,m4v,mjpeg,obu,vc1,"
@@ -70,10 +70,10 @@ std::string reasonOf(int code) {
     return lower(errorText(code));
 }
 
-// What the library reads from.
+// What the library reads from. See MediaInput::leaveBytes: then reads return at once, with undefined bytes.
 struct Bytes {
     std::unique_ptr<QvByteSource> source;
-    long long left = -1;  // the position while packets are read without their bytes; -1: bytes are read
+    long long left = -1;  // the position while no bytes are read; -1: bytes are read
 };
 
 int readBytes(void* opaque, std::uint8_t* to, int count) {
@@ -115,11 +115,13 @@ std::int64_t seekBytes(void* opaque, std::int64_t offset, int whence) {
 
 int openNothing(AVFormatContext*, AVIOContext**, const char*, int, AVDictionary**) { return AVERROR(EACCES); }
 
+// Whether the packet is the one of the key.
 bool same(const PacketKey& key, const AVPacket& packet, bool byPosition) {
     const bool placed = key.position >= 0 && packet.pos >= 0;
     if (placed && key.position != packet.pos) return false;
     if (placed && byPosition) return true;
-    // Several packets may have one place. A time that the index has and the packet lacks says nothing.
+    // Packets with the same position have different times. Decoding times count where the index has no
+    // others.
     if (key.pts != AV_NOPTS_VALUE) return key.pts == packet.pts;
     if (key.dts != AV_NOPTS_VALUE) return packet.pts == AV_NOPTS_VALUE && key.dts == packet.dts;
     return placed;
@@ -131,8 +133,8 @@ bool after(const PacketKey& key, const AVPacket& packet) {
     return key.position >= 0 && packet.pos > key.position;
 }
 
-// Frames that follow each other without a container. A packet is identified by its place in the file, as its
-// time depends on where reading began.
+// An elementary stream without a container. Its packets are identified by their positions, as their times
+// depend on where reading started.
 bool isBare(const AVFormatContext& context) {
     return context.nb_streams == 1 && (context.iformat->flags & AVFMT_GENERIC_INDEX) &&
            !(context.iformat->flags & AVFMT_NO_BYTE_SEEK) && lower(context.iformat->name) != "ogg";
@@ -144,8 +146,8 @@ bool isEncrypted(const AVStream& stream) {
            av_stream_get_side_data(&stream, AV_PKT_DATA_ENCRYPTION_INIT_INFO, nullptr);
 }
 
-// Codecs whose packets the library can describe without their bytes. It takes captions and frames of DV with
-// sound apart as it reads them.
+// Codecs whose packets the library can describe without their bytes. Captions and DV with sound are not among
+// them: the demultiplexer splits their packets.
 bool isKnownByTable(const AVCodecParameters& codec) {
     if (codec.codec_tag == MKTAG('v', 'd', 'v', 'a') || codec.codec_tag == MKTAG('d', 'v', 'c', 'a'))
         return false;
@@ -171,7 +173,7 @@ bool isPicture(const std::string& name) {
     return av_match_ext(name.c_str(), "png,jpg,jpeg,tif,tiff,dpx,exr") != 0;
 }
 
-// Program and transport streams.
+// Program and transport streams, whose bytes a parser divides into packets.
 bool isCutByParser(const AVFormatContext& context) {
     const std::string name = context.iformat->name;
     return name == "mpeg" || name == "mpegts";
@@ -257,7 +259,7 @@ int MediaInput::State::open(const MediaBytes& from, const std::string& format) {
     const AVInputFormat* forced = nullptr;
     if (!format.empty() && !(forced = av_find_input_format(format.c_str()))) return AVERROR_DEMUXER_NOT_FOUND;
     const Any name = from.name().toString();
-    // Given the name of a picture, the library would look for a numbered sequence.
+    // From the name of a picture the library would look for a numbered sequence.
     int result =
         avformat_open_input(&context, isPicture(name.asString("")) ? "" : name.asString(""), forced, nullptr);
     if (result >= 0) result = avformat_find_stream_info(context, nullptr);
@@ -349,7 +351,7 @@ bool MediaInput::rewind() {
     state_->takeBytes();
     state_->hasFound = false;
     av_packet_unref(state_->found.get());
-    // The library's reader of WavPack keeps the head of a block over a seek.
+    // The library's demultiplexer of WavPack keeps the header of a block after a seek.
     if (std::exchange(lost_, false) || std::strcmp(context().iformat->name, "wv") == 0) {
         const int streams = static_cast<int>(context().nb_streams);
         if (!openState(failure_)) return false;
@@ -373,12 +375,13 @@ bool MediaInput::rewind() {
 // Reads up to that packet. False if it does not follow.
 bool MediaInput::find(int stream, const PacketKey& key) {
     const bool bare = isBare(context());
-    // Where pictures are cut out of a stream of bytes, the first one after a seek may be the end of another
-    // with the time of this one.
+    // Where a parser divides the bytes into pictures, the first one after a seek may be the second half of an
+    // earlier picture, with the time of this one.
     bool whole = !isCutByParser(context());
-    // Times of a page of Ogg are counted back from its end, which the end of the sound may have moved.
+    // In Ogg times are counted back from the end of a page, and the last page may end early. The position of
+    // the page and the packet's place in it identify the packet instead.
     const bool pages = lower(context().iformat->name) == "ogg";
-    std::uint32_t before = 0;  // packets of the page
+    std::uint32_t before = 0;  // packets of the page that were read
     AVPacket& packet = *state_->found;
     while (read(packet) == Read::packet) {
         if (packet.stream_index == stream) {

@@ -1,8 +1,8 @@
 // A film's bytes, and a demultiplexer over them.
 //
 // Every reader of a stream has a demultiplexer of its own, so that streams are read and sought independently.
-// Bytes come through the engine's byte sources only: no protocol of the library is open, and a document that
-// names other files opens none of them.
+// Bytes come through the engine's byte sources only: the library's own protocols are disabled, and a file
+// that refers to other files makes it open none of them.
 #pragma once
 
 #include <cstddef>
@@ -18,7 +18,8 @@ struct AVPacket;
 
 namespace av {
 
-// Where the bytes are: a file, or a source that the application has. Outlives the inputs that are made of it.
+// Where the bytes are: a file, or a source of the application. Has to outlive the inputs that are opened on
+// it.
 class MediaBytes {
   public:
     explicit MediaBytes(const Any& filename);
@@ -35,7 +36,7 @@ class MediaBytes {
     QvByteSource* source_ = nullptr;
 };
 
-// What tells packets of one stream apart; see PacketIndex.
+// Identifies a packet among those of its stream; see PacketIndex.
 struct PacketKey {
     std::int64_t pts, dts;      // in the stream's time base; AV_NOPTS_VALUE where the container has none
     std::int64_t position;      // byte in the file; -1 where the container doesn't say
@@ -44,9 +45,9 @@ struct PacketKey {
 
 class MediaInput {
   public:
-    // Opens and probes. `format` is the name of a container that the library must use; "" finds it out.
-    // Null with `reason`, a part of a sentence, for what is none of the containers that are allowed, is
-    // beyond the limits (source/limits.h), encrypted, or has no stream.
+    // Opens and probes. `format`: the library's name of the container; "": it is detected. Null with
+    // `reason`, a part of a sentence, for a file whose container is not allowed, that is beyond the limits
+    // (source/limits.h) or encrypted, or that has no stream.
     static std::unique_ptr<MediaInput> open(const MediaBytes& bytes, const std::string& format,
                                             std::string& reason);
     ~MediaInput();
@@ -61,10 +62,10 @@ class MediaInput {
     // are never decoded. -1: of all streams.
     void selectOnly(int stream);
 
-    // Where the container has one table of all packets: from here to the next rewind packets come as they do
-    // else, but their bytes are not read from the file, and are anything; which of them are keys is the
-    // table's word then, and not the codec's. False where there is no such table, or where the library needs
-    // the bytes to say what the packets are.
+    // For containers that have one table of all packets: until the next rewind read() delivers the same
+    // packets, but does not read their bytes from the file, so their content is undefined. Whether a packet
+    // is a key packet then comes from the table, not from the codec. False where there is no such table, or
+    // where the library can't describe the packets without their bytes.
     bool leaveBytes();
 
     enum class Read { packet, end, failed };
@@ -72,13 +73,14 @@ class MediaInput {
     Read read(AVPacket& packet);
     const std::string& failure() const { return failure_; }
 
-    // The next packet that read() delivers of this stream is this one. Where the container's own seek misses
-    // it, the file is read from an earlier place until it comes. False with failure(): it did not come.
-    // What follows comes in the order of the index; times of packets may differ from those of the index, as
-    // some containers derive them from where reading began.
-    // `number` is that of the packet among those of its stream.
+    // Moves so that the next packet of this stream that read() delivers is `packet`, the one with this
+    // `number` in its stream. Where the container's own seek misses it, the file is read from an earlier
+    // place. False with failure() if the packet is not found. The packets after it come in the order of the
+    // index, but their times may differ from those of the index: in some containers they depend on where
+    // reading started.
     bool seekTo(int stream, const PacketKey& packet, std::size_t number);
-    // After a failed read the file is opened again: references into context() end.
+    // Back to the first packet. After a failed read the file is opened again, and references into context()
+    // become invalid.
     bool rewind();
 
   private:
@@ -87,7 +89,7 @@ class MediaInput {
     const MediaBytes* bytes_ = nullptr;
     std::string format_;
     int only_ = -1;
-    bool lost_ = false;  // a read failed: the demultiplexer may not find back from there
+    bool lost_ = false;  // a read failed: from there the demultiplexer may be unable to seek
     std::string failure_;
 
     MediaInput();
