@@ -33,7 +33,9 @@ int setNames(Settings& settings, const Any& value) {
     if (!value.isVector() || value.asVector().size() > fields) return QvStatus::invalidParam;
     for (const Any& name : value.asVector())
         if (!name.isText()) return QvStatus::invalidParam;
-    for (int i = 0; i < fields; ++i) settings.filenames[static_cast<std::size_t>(i)] = value.asVector().at(i);
+    int field = 0;
+    for (Any& name : settings.filenames)
+        name = value.asVector().at(field++);  // none for those after the last
     return QvStatus::ok;
 }
 

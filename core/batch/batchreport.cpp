@@ -11,15 +11,14 @@ namespace {
 
 // Empty where there is no message, or no memory for one.
 AnyDict infoOf(const char* message) {
-    AnyDict info;
     try {
-        if (message && *message) info.set("msg", Any(message));
+        if (message && *message) return AnyDict("msg", message);
     } catch (const std::bad_alloc&) {
-        info.clear();
+        return {};
     } catch (const QvMemoryFailure&) {
-        info.clear();
+        return {};
     }
-    return info;
+    return {};
 }
 
 }  // namespace

@@ -1,6 +1,6 @@
 // A decoder for "mxf" in the place of one that a plug-in brings. Its files are a line of text: "video FRAMES
 // SEED" or "audio SAMPLES SEED [SAMPLERATE]". Pictures are GRAY, 16x8 at 25/1, each byte the seed plus the
-// frame; sounds are 16-bit mono that counts up from the seed.
+// frame; sounds are 16-bit mono that counts up from the seed, or can't be read where it is negative.
 #pragma once
 
 #include <cstring>
@@ -41,6 +41,7 @@ class MxfDecoder : public BaseDecodePipe {
         return 0;
     }
     int readSamples(int count, int) override {
+        if (seed_ < 0) return setError(QvStatus::failed, "no such samples");
         const int n = static_cast<int>(std::min<long long>(count, length_ - next_));
         if (n < 1) return QvStatus::endOfStream;
         QvPcm& pcm = *getAudioPtr(0);

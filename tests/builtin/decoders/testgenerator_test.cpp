@@ -73,16 +73,20 @@ TEST_F(Testgen, TheCardHasARoundCircle) {
 }
 
 TEST_F(Testgen, GrayBarsStandStill) {
-    decoder.setParam("mode", "graybar");
-    ASSERT_EQ(openVideo(videoDict(221, 64, 25, 1)), 0);
-    ASSERT_EQ(decoder.readFrame(0), 0);
-    const QvFrame& frame = *decoder.getFramePtr(0);
-    const std::string first = pixels();
     const int levels[] = {0, 26, 51, 77, 102, 128, 153, 179, 204, 230, 255};
-    for (int i = 0; i < 11; ++i) EXPECT_EQ(*frame.pixelPtr(i * 20 + 10, 30), levels[i]);
-    EXPECT_EQ(*frame.pixelPtr(220, 30), 128) << "the last column stays";
-    ASSERT_EQ(decoder.readFrame(0), 0);
-    EXPECT_TRUE(pixels() == first);
+    for (const int width : {221, 220}) {
+        decoder.close();
+        decoder.setParam("mode", "graybar");
+        ASSERT_EQ(openVideo(videoDict(width, 64, 25, 1)), 0);
+        ASSERT_EQ(decoder.readFrame(0), 0);
+        const QvFrame& frame = *decoder.getFramePtr(0);
+        const std::string first = pixels();
+        const int bar = (width - 1) / 11;  // the last column never belongs to one
+        for (int i = 0; i < 11; ++i) EXPECT_EQ(*frame.pixelPtr(i * bar + bar / 2, 30), levels[i]);
+        for (int x = 11 * bar; x < width; ++x) EXPECT_EQ(*frame.pixelPtr(x, 30), 128) << x;
+        ASSERT_EQ(decoder.readFrame(0), 0);
+        EXPECT_TRUE(pixels() == first);
+    }
 }
 
 TEST_F(Testgen, OverridesRedrawAndRestore) {
@@ -98,6 +102,9 @@ TEST_F(Testgen, OverridesRedrawAndRestore) {
     ASSERT_EQ(decoder.setOverride(1, 0, "framerate", QvFramerate(50.0)), 0);
     EXPECT_EQ(decoder.nrFrames(0), 100);
     EXPECT_TRUE(decoder.getFramePtr(0)->framerate == QvFramerate(50.0));
+    ASSERT_EQ(decoder.setOverride(1, 0, "framerate", Any()), 0);
+    EXPECT_TRUE(pixels() == before) << "with the parts that move";
+    ASSERT_EQ(decoder.setOverride(1, 0, "framerate", QvFramerate(50.0)), 0);
     ASSERT_EQ(decoder.setOverride(1, 0, "duration", 0.5), 0);
     EXPECT_EQ(decoder.nrFrames(0), 25);
     EXPECT_EQ(decoder.nrSamples(0), 22050);
@@ -106,6 +113,19 @@ TEST_F(Testgen, OverridesRedrawAndRestore) {
     decoder.close();
     ASSERT_EQ(decoder.open(), 0);
     EXPECT_EQ(decoder.nrFrames(0), 50) << "nothing of an override is left";
+}
+
+TEST_F(Testgen, ALoopIsTheSoundAndThenSilence) {
+    for (const int count : {1, 2, 5}) {
+        QvPcm sound;
+        fillSound(sound, count, 1, 2, 48000);
+        SoundLoop loop;
+        ASSERT_EQ(loop.init(sound, 3, 100), 0);
+        short got[7] = {};
+        loop.copy(reinterpret_cast<unsigned char*>(got), 7);
+        const auto* from = reinterpret_cast<const short*>(sound.ptr(0));
+        for (int i = 0; i < 7; ++i) EXPECT_EQ(got[i], i % 3 < count ? from[i % 3] : 0) << count << " " << i;
+    }
 }
 
 TEST_F(Testgen, BeepsOnceASecondAndEnds) {

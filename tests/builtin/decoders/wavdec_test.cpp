@@ -288,13 +288,18 @@ TEST_F(Wav, ClippedSamplesAreCountedOnceAndWarnedOf) {
     decoder.seekToSample(10000, 0);
     EXPECT_EQ(decoder.readSamples(30000, 0), 30000);
     EXPECT_EQ(decoder.getAudioParam(0, "clippedSamples").toInt64(), 4000);
+    // In a range they are counted from nothing.
+    EXPECT_EQ(decoder.setParam("clipRange", AnyVector(20000, 30000)), 0);
+    decoder.seekToSample(0, 0);
+    EXPECT_EQ(decoder.readSamples(50000, 0), 50000);
+    EXPECT_EQ(decoder.getAudioParam(0, "clippedSamples").toInt64(), 1000);
     qv_log()->clear();
     decoder.close();
     AnyVector warnings;
     qv_log()->getAll(warnings);
     ASSERT_EQ(warnings.size(), 1);
     EXPECT_STREQ(warnings.at(0).asDict().getString("text", ""),
-                 "4000 samples beyond full scale were clipped");
+                 "1000 samples beyond full scale were clipped");
 }
 
 TEST_F(Wav, ExtendedReadsOtherFiles) {

@@ -102,6 +102,12 @@ TEST(AudioPipe, TheReadsFollowTheConvertersRatio) {
     EXPECT_EQ(pipe.process(&decoder, 0, 1922), 0);
     EXPECT_EQ(decoder.requests, (std::vector<int>{1764, 16}));  // never less
     EXPECT_EQ(pipe.at(1).getParam("splsToGet"), Any(16));
+
+    Pipe front({"srconvert", "b"});
+    front.converter(0, 44100, 48000);
+    ASSERT_EQ(front.open(), 0);
+    EXPECT_EQ(front.process(&decoder, 0, 1920), 0);
+    EXPECT_EQ(front.at(0).getParam("splsToGet"), Any(1920));
 }
 
 TEST(AudioPipe, ErrorsComeOutAtOnce) {

@@ -53,6 +53,11 @@ struct PipeFailure : testing::Test {
             const bool aborting = call.ends_with(".abort");
             outputs_.calls.clear();
             EXPECT_EQ((aborting ? pipe_->abort() : pipe_->close()) != 0, !atWrite);
+            if (call.starts_with("rawmux.") && byStatus) {
+                EXPECT_EQ(std::string(pipe_->errorDesc()).find(aborting ? "Aborting muxer" : "Closing muxer"),
+                          0u)
+                    << pipe_->errorDesc();
+            }
             EXPECT_TRUE(atWrite || outputs_.how == FailingOutputs::noMemory || *pipe_->errorDesc());
             for (const std::string member : {"filesink", "rawmux", "rawvenc", "rawaenc"})
                 EXPECT_EQ(std::count(outputs_.calls.begin(), outputs_.calls.end(),

@@ -23,6 +23,32 @@ TEST_F(Contract, StreamParametersAreReachedByName) {
     EXPECT_THROW(decoder.getParam("video1/width"), QvAssertFailure);
 }
 
+TEST_F(Contract, AStreamIsDescribedOrTheMistakeNamed) {
+    QvElementaryStream is;
+    decoder.elementaryStream(qvVideoStream, 0, &is);
+    EXPECT_EQ(is.type, qvVideoStream);
+    EXPECT_STREQ(is.filename.asString(""), "a.mov");
+    EXPECT_TRUE(is.framerate == QvFramerate(25.0));
+    const struct {
+        int type, stream;
+        QvElementaryStream* to;
+        const char* why;
+    } wrong[] = {{1, 0, nullptr, "Invalid stream pointer"},
+                 {4, 0, &is, "Invalid stream type"},
+                 {1, -1, &is, "Invalid stream number"},
+                 {2, 2, &is, "Invalid stream number"},
+                 {2, 1, &is, "Internal decoder error"}};
+    for (const auto& c : wrong) {
+        std::string why;
+        try {
+            decoder.elementaryStream(c.type, c.stream, c.to);
+        } catch (const QvAssertFailure& failure) {
+            why = failure.what();
+        }
+        EXPECT_NE(why.find(c.why), why.npos) << why << " of " << c.type << " " << c.stream;
+    }
+}
+
 TEST_F(Contract, SeeksGoToTheFrameAndSampleOfATime) {
     const auto seek = [this](long long ticks, int type, int stream) {
         decoder.calls.clear();

@@ -3,10 +3,12 @@
 
 #include <cmath>
 
+#include "builtin/decoders/mix/adecstream.h"
 #include "builtin/shared/inputnesting.h"
 #include "core/compose/qvaudiomixdecsetup.h"
 #include "core/decode/decodefactory.h"
 #include "core/engine/modules/qvregistry.h"
+#include "core/engine/status.h"
 #include "core/job/filtersstate.h"
 #include "core/media/qvpcm.h"
 #include "tests/support/checks.h"
@@ -147,6 +149,7 @@ TEST_F(AuMixDec, SeeksAreExactAtEqualRates) {
         ASSERT_EQ(decoder->readSamples(count, 0), count);
         Values got;
         append(got, *decoder->getAudioPtr(0));
+        EXPECT_EQ(decoder->getAudioPtr(0)->position(), at + count);
         for (int i = 0; i < count; ++i) {
             const auto t = static_cast<std::size_t>(at + i);
             const int sum = sound[t] + (t < other.size() ? other[t] : 0);
@@ -231,6 +234,15 @@ TEST_F(AuMixDec, AFailedInputLeavesADecoderThatReadsNothing) {
         EXPECT_EQ(decoder->readSamples(10, 0), -1);
         EXPECT_EQ(decoder->seekToSample(0, 0), -4);
     }
+}
+
+TEST_F(AuMixDec, AStreamThatCantBeSelectedIsRefused) {
+    struct Refusing : BaseDecodePipe {
+        int select(int, int) override { return QvStatus::failed; }
+    } refusing;
+    std::string reason;
+    EXPECT_EQ(ADecStream(&refusing, 0, Any("a.wav")).prepare(48000, nullptr, reason), QvStatus::failed);
+    EXPECT_EQ(reason, "it can't be selected");
 }
 
 TEST_F(AuMixDec, WhatCantBeMixedIsRefused) {

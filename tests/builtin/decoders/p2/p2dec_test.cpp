@@ -1,6 +1,8 @@
 // Clips by their documents and folders, takes on several cards, and clips that can't be opened.
 #include "builtin/decoders/p2/p2dec.h"
 
+#include <regex>
+
 #include <gmock/gmock.h>
 
 #include "core/decode/decodefactory.h"
@@ -201,6 +203,26 @@ TEST_F(P2, EssenceThatIsShorterThanTheDocumentSaysIsTruncated) {
     }
     writeP2Clip(folder.path(), {.name = "A", .frames = 8, .samples = {15360}, .duration = 8});
     EXPECT_EQ(expected(*open(document), qvVideoStream, 0, "framesExpected"), 0);
+}
+
+TEST_F(P2, ADocumentMayNameItsNamespaceInEachTag) {
+    const std::string document = writeP2Clip(folder.path(), {.name = "A", .duration = 5});
+    const std::string text = TempFolder::read(document);
+    const std::string named = std::regex_replace(text, std::regex("<(/?)([A-Z])"), "<$1p2:$2");
+    writeText(document, std::regex_replace(named, std::regex("xmlns="), "xmlns:p2="));
+    const auto decoder = open(document);
+    EXPECT_EQ(fault, "");
+    EXPECT_EQ(decoder->nrStreams(qvAudioStream), 2);
+    EXPECT_EQ(decoder->nrFrames(0), 5);
+}
+
+TEST_F(P2, SoundThatCantBeReadGivesItsReason) {
+    const std::string document = writeP2Clip(folder.path(), {.name = "A"});
+    writeText(folder.path() / "CONTENTS" / "AUDIO" / "A00.MXF", "audio 9600 -1");
+    const auto decoder = open(document);
+    ASSERT_EQ(fault, "");
+    EXPECT_EQ(decoder->readSamples(100, 0), QvStatus::failed);
+    EXPECT_THAT(decoder->errorDesc(), HasSubstr("no such samples"));
 }
 
 TEST_F(P2, ForeignDocumentsAreRefusedQuietly) {

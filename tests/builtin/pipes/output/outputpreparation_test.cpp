@@ -45,6 +45,7 @@ TEST_F(Preparation, TheFirstVideoEncodersRateGoesToAllOthers) {
     append<FakeVideoEncoder>(qvVideoStream, AnyDict("framerate", rate));
     auto& second = append<FakeVideoEncoder>(qvVideoStream, AnyDict("framerate", QvFramerate(24.0)));
     audio.refused = AnyDict("framerate", 1);
+    streams_.append(std::make_unique<OutputStream>(qvAudioStream));  // whose encoder is missing
     run();
     EXPECT_EQ(second.params.get("framerate").asFramerate(), rate);
     EXPECT_EQ(target.params.get("framerate").asFramerate(), rate);
