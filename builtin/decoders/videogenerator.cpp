@@ -210,6 +210,4 @@ void VideoGenerator::setFramerate(const QvFramerate& rate) {
     framerate_ = rate;
     countFrames();
     drawCard();
-    showCard();
-    drawMoving();
 }

@@ -24,7 +24,7 @@ class VideoGenerator : public GeneratorStream {
 
     // New claims about the picture, as overrides make them: the frame that is there is drawn again.
     void setFrameAspect(double aspect);
-    void setFramerate(const QvFramerate& rate);
+    void setFramerate(const QvFramerate& rate);  // seen from the next seek on
 
   private:
     using Frames = std::vector<std::unique_ptr<QvFrame>>;
