@@ -22,9 +22,10 @@ class VideoGenerator : public GeneratorStream {
     int frames() const { return frames_; }
     QvFrame* head() { return views_.empty() ? nullptr : views_.front().get(); }
 
-    // New claims about the picture, as overrides make them: the frame that is there is drawn again.
+    // New claims about the picture, as overrides make them. For an aspect the frame that is there is drawn
+    // again, for a rate the one of the next seek.
     void setFrameAspect(double aspect);
-    void setFramerate(const QvFramerate& rate);  // seen from the next seek on
+    void setFramerate(const QvFramerate& rate);
 
   private:
     using Frames = std::vector<std::unique_ptr<QvFrame>>;
