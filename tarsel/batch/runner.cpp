@@ -159,7 +159,7 @@ void BatchRunner::listen() {
         Entry& entry = entries_[i];
         if (!entry.child) continue;
         entry.child->time().tick();
-        const bool open = entry.child->listen();
+        const bool open = entry.child->readProgress();
         for (const std::string& warning : entry.child->takeWarnings()) {
             entry.result.warnings.push_back(warning);
             if (!options_.quiet) say("task " + std::to_string(entry.task.number) + ": warning: " + warning);
@@ -265,7 +265,7 @@ void BatchRunner::show() {
     for (const Entry& entry : entries_) {
         ended += entry.ended ? 1 : 0;
         if (!entry.child) continue;
-        weight += entry.weight * entry.child->part();
+        weight += entry.weight * entry.child->done();
         state.frame += entry.child->frames();
         state.outSeconds += entry.child->outSeconds();
     }
@@ -291,12 +291,12 @@ void BatchRunner::report(const Entry& entry, const char* state) const {
     figures.state = state;
     if (entry.child) {
         const ChildTask& child = *entry.child;
-        figures.percent = child.part() * 100;
+        figures.percent = child.done() * 100;
         figures.frame = child.frames();
         figures.outMicroseconds = static_cast<long long>(child.outSeconds() * 1e6);
         figures.speed = child.speed();
         figures.elapsedSeconds = entry.child->time().seconds();
-        if (child.part() > 0) figures.etaSeconds = figures.elapsedSeconds * (1 - child.part()) / child.part();
+        if (child.done() > 0) figures.etaSeconds = figures.elapsedSeconds * (1 - child.done()) / child.done();
         if (figures.elapsedSeconds > 0)
             figures.fps = static_cast<double>(child.frames()) / figures.elapsedSeconds;
     } else {

@@ -49,7 +49,7 @@ void Submitter::submit() {
 
 // What an array printed is of use until its tasks are submitted again.
 void Submitter::forgetEnded() {
-    const std::vector<std::string> living = queue_.livingArrays();
+    const std::vector<std::string> living = queue_.activeArrays();
     const std::set<std::string> kept(living.begin(), living.end());
     for (const std::string& name : submissions_.names())
         if (!kept.count(name)) removeFiles(name);
@@ -68,7 +68,7 @@ std::vector<TaskPlace> Submitter::places() {
         const BatchTask& task = tasks_[i];
         const std::string journal = file_.journal(task.id);
         if (!task.enabled || !names.insert(task.id).second) continue;
-        if (queue_.lives(task.id)) {
+        if (queue_.isActive(task.id)) {
             places[i].job = queue_.tasks.at(task.id).job;
             ++living_;
         } else if (RecordFile::isLocked(journal)) {

@@ -49,8 +49,8 @@ TaskState TaskStates::of(const BatchTask& task) const {
     for (const char* final : {"done", "disabled", "running"})
         if (state.name == std::string_view(final)) place = nullptr;
     if (!place) return state;
-    if (place->lives)
-        state.name = place->waits ? "queued" : "running";
+    if (place->active)
+        state.name = place->pending ? "queued" : "running";
     else if (state.record.start < place->time)
         state.name = answered_ ? "lost" : "submitted";
     return state;
@@ -58,7 +58,7 @@ TaskState TaskStates::of(const BatchTask& task) const {
 
 std::string TaskStates::jobOf(const BatchTask& task) const {
     const ClusterQueue::Place* place = placeOf(task);
-    return place && place->lives ? place->job + "_" + std::to_string(place->index) : "";
+    return place && place->active ? place->job + "_" + std::to_string(place->index) : "";
 }
 
 std::string TaskStates::endOf(const BatchTask& task, const TaskState& state) {

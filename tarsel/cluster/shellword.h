@@ -1,7 +1,7 @@
-// Words in the script of an element.
+// Quoting for scripts of the shell.
 #pragma once
 
 #include <string>
 
-// One word for the shell, in quotes, in which no character acts.
+// The text as one word for the shell, in quotes that take every character literally.
 std::string shellWord(const std::string& text);

@@ -14,38 +14,42 @@ namespace {
 
 using Words = std::vector<std::string>;
 
-constexpr double kPatience = 60;          // seconds for what changes something
-constexpr double kQuestionPatience = 30;  // for the queue
-constexpr double kShortPatience = 5;      // for what may be left out
+// Seconds that a program may take.
+constexpr double kChangeTimeout = 60;  // to submit or cancel
+constexpr double kQueueTimeout = 30;   // to list the queue
+constexpr double kHistoryTimeout = 5;  // for ended jobs, which are not essential
 
-// Variables by which a user makes the answers of these programs other ones.
-const Words& ownVariables() {
+// Variables of the environment, or their prefixes, that change what these programs do or print. The programs
+// don't get them.
+const Words& changingVariables() {
     static const Words prefixes = {"SQUEUE_",      "SCANCEL_",         "SACCT_",         "SBATCH_ARRAY_INX=",
                                    "SBATCH_WAIT=", "SBATCH_CLUSTERS=", "SLURM_CLUSTERS="};
     return prefixes;
 }
 
-// Options of sbatch that are this tool's own, or after which the array is none that it can follow.
-constexpr std::string_view kOwnLetters = "JadMWhVQ";
-constexpr std::string_view kOwnOptions[] = {
+// Options of sbatch that this tool sets itself, or with which it could not follow the array.
+constexpr std::string_view kForbiddenLetters = "JadMWhVQ";
+constexpr std::string_view kForbiddenOptions[] = {
     "--job-name", "--array",    "--dependency", "--clusters", "--wait", "--help",  "--usage",
     "--version",  "--parsable", "--test-only",  "--quiet",    "--wrap", "--jobid", "--no-kill-on-invalid-dep",
 };
-constexpr std::string_view kPlainLetters = "bHIkOsuv";  // options without a value, so that others may follow
-constexpr size_t kShortestPrefix = 4;                   // of a long option that getopt takes for the whole
+// Short options without a value: other letters may follow in the same word.
+constexpr std::string_view kFlagLetters = "bHIkOsuv";
+constexpr size_t kShortestPrefix = 4;  // long options may be shortened; shorter than this they are ambiguous
 
-bool isOwn(std::string_view word) {
+bool isForbidden(std::string_view word) {
     if (!word.starts_with("--")) {
-        const size_t last = std::min(word.find_first_not_of(kPlainLetters, 1), word.size() - 1);
-        return kOwnLetters.find(word[last]) != std::string_view::npos;
+        const size_t last = std::min(word.find_first_not_of(kFlagLetters, 1), word.size() - 1);
+        return kForbiddenLetters.find(word[last]) != std::string_view::npos;
     }
     const std::string_view name = word.substr(0, word.find('='));
-    return std::any_of(std::begin(kOwnOptions), std::end(kOwnOptions), [&](std::string_view whole) {
-        return name.size() >= kShortestPrefix && whole.starts_with(name);
-    });
+    return std::any_of(
+        std::begin(kForbiddenOptions), std::end(kForbiddenOptions),
+        [&](std::string_view whole) { return name.size() >= kShortestPrefix && whole.starts_with(name); });
 }
 
-// In a name of an output '%' begins what Slurm puts in, and '\' ends that.
+// Slurm replaces '%' and a letter in the name of an output by a value; "%%" is a '%'. A '\' switches that
+// off, so a name that has one can't be written safely.
 std::string outputName(const std::string& name) {
     if (name.find('\\') != std::string::npos) return "/dev/null";
     std::string pattern;
@@ -68,14 +72,14 @@ Words fieldsOf(const std::string& line, char separator) {
 }
 
 Answer ask(const Words& words, const std::string& input, double seconds) {
-    return askProgram(words, input, seconds, ownVariables());
+    return askProgram(words, input, seconds, changingVariables());
 }
 
 [[noreturn]] void refuse(const std::string& program, const std::string& text) {
     throw failure(Msg::schedulerRefuses, {program, text.empty() ? "it says nothing" : inLine(text)});
 }
 
-Answer askSurely(const Words& words, const std::string& input, double seconds) {
+Answer askOrThrow(const Words& words, const std::string& input, double seconds) {
     Answer answer = ask(words, input, seconds);
     if (answer.status != 0) refuse(words[0], answer.err);
     return answer;
@@ -88,11 +92,11 @@ std::string SlurmScheduler::coresWord() const {
     return "\"${SLURM_CPUS_ON_NODE:-${SLURM_CPUS_PER_TASK:-1}}\"";
 }
 
-// A word that is no option would be taken for the script, so values have to be parts of their options.
+// sbatch takes a word that is no option for the script, so each value has to be in the word of its option.
 void SlurmScheduler::checkOptions(const Words& options) const {
     for (const std::string& word : options) {
         if (word.size() < 2 || word[0] != '-' || word == "--") throw failure(Msg::schedulerWord, {word});
-        if (isOwn(word)) throw failure(Msg::schedulerOwnOption, {word});
+        if (isForbidden(word)) throw failure(Msg::schedulerOwnOption, {word});
     }
 }
 
@@ -106,7 +110,7 @@ std::string SlurmScheduler::submit(const ClusterArray& array) const {
                    "--open-mode=append"};
     if (!array.after.empty()) words.push_back("--dependency=afterany:" + joined(array.after, ":"));
     words.insert(words.end(), array.options.begin(), array.options.end());
-    const Answer answer = askSurely(words, array.script, kPatience);
+    const Answer answer = askOrThrow(words, array.script, kChangeTimeout);
     // "123" or "123;cluster"
     const std::string job = answer.out.substr(0, answer.out.find_first_of(";\n"));
     if (!indexOf(job)) refuse(words[0], answer.out + answer.err);
@@ -118,8 +122,8 @@ std::vector<ClusterElement> SlurmScheduler::elements(const Words& arrays) const 
     if (arrays.empty()) return elements;
     const std::set<std::string> wanted(arrays.begin(), arrays.end());
     const Answer answer =
-        askSurely({"squeue", "--noheader", "--array", "--format=%j|%F|%K|%T|%r"}, "", kQuestionPatience);
-    // One that is left out would be submitted again, so an answer that was cut is none.
+        askOrThrow({"squeue", "--noheader", "--array", "--format=%j|%F|%K|%T|%r"}, "", kQueueTimeout);
+    // An element that is missing here would be submitted again, so a truncated answer is an error.
     if (!answer.out.empty() && answer.out.back() != '\n') throw failure(Msg::schedulerGarbled, {"squeue"});
     for (const std::string& line : fieldsOf(answer.out, '\n')) {
         const Words fields = fieldsOf(line, '|');
@@ -139,7 +143,7 @@ std::map<std::pair<std::string, size_t>, std::string> SlurmScheduler::ends(const
     try {
         answer = ask({"sacct", "--noheader", "--allocations", "--parsable2", "--starttime=now-30days",
                       "--name=" + joined(arrays, ","), "--format=JobName,JobID,State"},
-                     "", kShortPatience);
+                     "", kHistoryTimeout);
     } catch (const Failure&) {
         return ends;
     }
@@ -158,5 +162,5 @@ void SlurmScheduler::cancel(const Words& jobs) const {
     if (jobs.empty()) return;
     Words words = {"scancel", "--quiet"};
     words.insert(words.end(), jobs.begin(), jobs.end());
-    askSurely(words, "", kPatience);
+    askOrThrow(words, "", kChangeTimeout);
 }

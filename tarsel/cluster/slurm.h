@@ -1,11 +1,11 @@
-// Slurm, by its programs sbatch, squeue, scancel and sacct.
+// Slurm, used by its programs sbatch, squeue, scancel and sacct.
 #pragma once
 
 #include "tarsel/cluster/scheduler.h"
 
 class SlurmScheduler : public Scheduler {
   public:
-    static constexpr size_t kMostElements = 1000;  // of an array, where a site has set nothing else
+    static constexpr size_t kMostElements = 1000;  // of an array: Slurm's default limit
 
     std::string indexWord() const override;
     std::string coresWord() const override;

@@ -12,7 +12,7 @@ std::string lineOf(const SubmittedArray& array) {
         .dump();
 }
 
-// A line that is something else adds nothing.
+// Adds the array of a line of the file. Other lines are ignored.
 void take(std::vector<SubmittedArray>& arrays, const std::string& line) {
     const Json object = Json::parse(line, nullptr, false);
     if (!object.is_object()) return;
@@ -43,48 +43,48 @@ void Submissions::add(SubmittedArray array) {
 
 void Submissions::keep(const std::vector<std::string>& names) {
     const std::set<std::string> kept(names.begin(), names.end());
-    const auto gone = std::remove_if(arrays_.begin(), arrays_.end(),
-                                     [&](const SubmittedArray& array) { return !kept.count(array.name); });
-    if (gone == arrays_.end()) return;
-    arrays_.erase(gone, arrays_.end());
+    const auto removed = std::remove_if(arrays_.begin(), arrays_.end(),
+                                        [&](const SubmittedArray& array) { return !kept.count(array.name); });
+    if (removed == arrays_.end()) return;
+    arrays_.erase(removed, arrays_.end());
     std::vector<std::string> lines;
     for (const SubmittedArray& array : arrays_) lines.push_back(lineOf(array));
     RecordFile(file_).replace(lines);
 }
 
 ClusterQueue::ClusterQueue(const Submissions& submissions, const std::vector<ClusterElement>& elements) {
-    std::map<std::pair<std::string, size_t>, const ClusterElement*> living;
-    for (const ClusterElement& element : elements) living[{element.array, element.index}] = &element;
+    std::map<std::pair<std::string, size_t>, const ClusterElement*> active;
+    for (const ClusterElement& element : elements) active[{element.array, element.index}] = &element;
     for (const SubmittedArray& array : submissions.arrays())
         for (size_t i = 0; i < array.tasks.size(); ++i) {
-            const auto found = living.find({array.name, i});
+            const auto found = active.find({array.name, i});
             Place place{array.name, "", i, false, false, array.time};
-            if (found != living.end()) {
+            if (found != active.end()) {
                 place.job = found->second->job;
-                place.waits = found->second->waits;
-                place.lives = true;
+                place.pending = found->second->pending;
+                place.active = true;
             }
-            // One that lives is never hidden by a later one that does not.
+            // An active place is kept even if a later one has ended.
             Place& known = tasks[array.tasks[i]];
-            if (place.lives || !known.lives) known = place;
+            if (place.active || !known.active) known = place;
         }
 }
 
-bool ClusterQueue::lives(const std::string& task) const {
+bool ClusterQueue::isActive(const std::string& task) const {
     const auto found = tasks.find(task);
-    return found != tasks.end() && found->second.lives;
+    return found != tasks.end() && found->second.active;
 }
 
 std::vector<std::string> ClusterQueue::jobs() const {
     std::set<std::string> jobs;
     for (const auto& [task, place] : tasks)
-        if (place.lives) jobs.insert(place.job);
+        if (place.active) jobs.insert(place.job);
     return {jobs.begin(), jobs.end()};
 }
 
-std::vector<std::string> ClusterQueue::livingArrays() const {
+std::vector<std::string> ClusterQueue::activeArrays() const {
     std::set<std::string> names;
     for (const auto& [task, place] : tasks)
-        if (place.lives) names.insert(place.array);
+        if (place.active) names.insert(place.array);
     return {names.begin(), names.end()};
 }

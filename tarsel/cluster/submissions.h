@@ -1,5 +1,5 @@
-// Which tasks of a list were given to a scheduler: a line for each array, written before the array is
-// submitted, so that no element is ever in the queue that is not known here.
+// The file that records which tasks of a list were submitted to a scheduler: one line for each array. A line
+// is written before its array is submitted, so that the queue never has an element that is not recorded.
 //
 //     {"event":"array", "name":"tarsel-...", "time":..., "tasks":["0123456789ab", ...]}
 //
@@ -17,38 +17,39 @@
 struct SubmittedArray {
     std::string name;
     std::time_t time = 0;
-    std::vector<std::string> tasks;  // their names
+    std::vector<std::string> tasks;  // by name
 };
 
 class Submissions {
   public:
-    // Does not make the file.
+    // Reads the file. A missing one is empty; it is not created.
     explicit Submissions(const std::string& file);
 
     const std::vector<SubmittedArray>& arrays() const { return arrays_; }
     std::vector<std::string> names() const;
-    // Each throws Failure (output). One process at a time.
+    // Both throw Failure (output), and may be used by one process at a time.
     void add(SubmittedArray array);
-    void keep(const std::vector<std::string>& names);  // and forget the others
+    void keep(const std::vector<std::string>& names);  // removes all other arrays
 
   private:
     std::string file_;
     std::vector<SubmittedArray> arrays_;
 };
 
-// What the scheduler has of a list, by the names of tasks.
+// Where the tasks of a list are in the scheduler's queue.
 struct ClusterQueue {
     struct Place {
         std::string array, job;
         size_t index = 0;
-        bool waits = false, lives = false;  // `lives`: it waits or runs
-        std::time_t time = 0;               // when it was submitted
+        bool pending = false;
+        bool active = false;   // it is pending or running
+        std::time_t time = 0;  // when it was submitted
     };
-    std::map<std::string, Place> tasks;  // the last place of each
+    std::map<std::string, Place> tasks;  // by name: the active place, or else the last one
 
     ClusterQueue() = default;
     ClusterQueue(const Submissions& submissions, const std::vector<ClusterElement>& elements);
-    bool lives(const std::string& task) const;
-    std::vector<std::string> jobs() const;          // that have living elements
-    std::vector<std::string> livingArrays() const;  // their names
+    bool isActive(const std::string& task) const;
+    std::vector<std::string> jobs() const;          // that have active elements
+    std::vector<std::string> activeArrays() const;  // their names
 };

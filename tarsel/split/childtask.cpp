@@ -1,8 +1,8 @@
 #include "tarsel/split/childtask.h"
 
-bool ChildTask::listen() {
+bool ChildTask::readProgress() {
     std::string text;
     const bool open = process_.read(text);
-    talk_.hear(text);
+    progress_.add(text);
     return open;
 }

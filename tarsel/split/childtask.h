@@ -1,4 +1,4 @@
-// A task that runs as a process of its own, and what that process says.
+// A task that runs in a process of its own, and what that process reports.
 #pragma once
 
 #include <string>
@@ -6,12 +6,12 @@
 
 #include "tarsel/host/childprocess.h"
 #include "tarsel/job/progress.h"
-#include "tarsel/split/tasktalk.h"
+#include "tarsel/split/progressreader.h"
 
 class ChildTask {
   public:
-    // `words`: arguments of the tool with which it sends objects (see docs/progress.schema.json) to its
-    // standard error. `task`: see handedTask. Throws Failure.
+    // `words`: arguments of the tool; they have to include "--progress json" to its standard error. `task`:
+    // see handedTask. Throws Failure.
     ChildTask(const std::vector<std::string>& words, const Descriptor& task)
         : process_(words, ChildProcess::Stream::error, task.get()) {
         time_.start();
@@ -21,20 +21,22 @@ class ChildTask {
     const ChildProcess& process() const { return process_; }
     RunningTime& time() { return time_; }
 
-    // Takes what it has said. False when it will say no more.
-    bool listen();
+    // Reads what it has reported since the last call. False once it has closed its end.
+    bool readProgress();
 
-    double part() const { return talk_.part(); }  // 0 to 1
-    long long frames() const { return talk_.frames(); }
-    double outSeconds() const { return talk_.outSeconds(); }
-    double speed() const { return talk_.speed(); }  // negative if unknown
-    // What came since the last call.
-    std::vector<std::string> takeWarnings() { return talk_.takeWarnings(); }
-    const std::string& failure() const { return talk_.failure(); }  // of its end; "" if it did not say
-    const std::vector<std::string>& outputs() const { return talk_.outputs(); }
+    double done() const { return progress_.done(); }  // 0 to 1
+    long long frames() const { return progress_.frames(); }
+    double outSeconds() const { return progress_.outSeconds(); }
+    double speed() const { return progress_.speed(); }  // negative if unknown
+    // Those since the last call.
+    std::vector<std::string> takeWarnings() { return progress_.takeWarnings(); }
+    const std::string& failure() const {
+        return progress_.failure();
+    }  // why it failed; "" if it has not, or gave no reason
+    const std::vector<std::string>& outputs() const { return progress_.outputs(); }
 
   private:
     ChildProcess process_;
     RunningTime time_;
-    TaskTalk talk_;
+    ProgressReader progress_;
 };

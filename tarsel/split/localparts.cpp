@@ -18,10 +18,10 @@ void LocalParts::begin(const std::vector<Part>& parts) {
     parts_ = parts;
     states_.resize(parts.size());
     children_.resize(parts.size());
-    startSome();
+    startParts();
 }
 
-void LocalParts::startSome() {
+void LocalParts::startParts() {
     auto running = std::ranges::count_if(children_, [](const auto& child) { return child != nullptr; });
     const std::lock_guard guard(lock_);
     for (; next_ < parts_.size() && running < atOnce_ && !failed_ && !cancelled_; ++next_, ++running) {
@@ -40,17 +40,17 @@ bool LocalParts::wait() {
     waitForAny(handles, kTick);
     bell_.silence();
     for (size_t part = 0; part < children_.size(); ++part)
-        if (children_[part]) listen(part);
-    if (failed_) stopOthers();
-    startSome();
+        if (children_[part]) readProgress(part);
+    if (failed_) stopAll();
+    startParts();
     return std::ranges::any_of(children_, [](const auto& child) { return child != nullptr; });
 }
 
-void LocalParts::listen(size_t part) {
+void LocalParts::readProgress(size_t part) {
     ChildTask& child = *children_[part];
-    const bool open = child.listen();
+    const bool open = child.readProgress();
     PartState& state = states_[part];
-    state.done = child.part();
+    state.done = child.done();
     state.frames = child.frames();
     for (std::string& warning : child.takeWarnings()) state.warnings.push_back(std::move(warning));
     if (!open) end(part);
@@ -68,17 +68,11 @@ void LocalParts::end(size_t part) {
     state.outputs = child->outputs();
     state.status = status < 0 ? static_cast<int>(Exit::failed) : status;
     if (status == 0 || failed_ || cancelled_) return;
-    state.failure = child->failure();
-    if (status < 0)
-        state.failure =
-            lineOf(Msg::splitPartKilled, {output_, std::to_string(part + 1), std::to_string(-status)});
-    else if (state.failure.empty())
-        state.failure =
-            lineOf(Msg::splitPartFailed, {output_, std::to_string(part + 1), std::to_string(status)});
+    setFailure(state, output_, part, status, std::max(-status, 0), child->failure());
     failed_ = true;
 }
 
-void LocalParts::stopOthers() {
+void LocalParts::stopAll() {
     const std::lock_guard guard(lock_);
     for (const auto& child : children_)
         if (child) child->process().askToEnd();
@@ -86,7 +80,7 @@ void LocalParts::stopOthers() {
 
 void LocalParts::cancel() {
     cancelled_ = true;
-    stopOthers();
+    stopAll();
     bell_.ring();
 }
 

@@ -1,4 +1,4 @@
-// Parts as processes of this machine, so many at a time.
+// Runs parts as processes of this machine, a limited number at a time.
 #pragma once
 
 #include <atomic>
@@ -20,10 +20,10 @@ class LocalParts : public PartExecutor {
     void pause(bool paused) override;
 
   private:
-    void startSome();
-    void listen(size_t part);
+    void startParts();
+    void readProgress(size_t part);
     void end(size_t part);
-    void stopOthers();
+    void stopAll();
 
     const int atOnce_;
     const std::vector<std::string> options_;
@@ -31,9 +31,9 @@ class LocalParts : public PartExecutor {
     std::vector<Part> parts_;
     std::vector<PartState> states_;
     std::vector<std::unique_ptr<ChildTask>> children_;
-    size_t next_ = 0;  // the one that begins next
+    size_t next_ = 0;  // part that starts next
     bool failed_ = false;
     Bell bell_;
-    std::mutex lock_;  // of the children, which signals and keys reach as well
+    std::mutex lock_;  // protects children_: cancel and pause come from other threads
     std::atomic<bool> cancelled_{false}, paused_{false};
 };

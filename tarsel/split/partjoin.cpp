@@ -12,9 +12,11 @@ namespace fs = std::filesystem;
 
 namespace {
 
-// Where the samples of a WAV file begin.
+// The byte at which the samples of a WAV file begin.
 size_t samplesAt(const std::string& file) {
-    constexpr size_t kForm = 12, kHead = 8, kMost = 1 << 16;  // bytes: "RIFF....WAVE", id and size, looked at
+    constexpr size_t kForm = 12;       // bytes of "RIFF....WAVE"
+    constexpr size_t kHead = 8;        // bytes of a chunk's id and size
+    constexpr size_t kMost = 1 << 16;  // bytes that are searched
     const std::string bytes = firstBytes(file, kMost);
     for (size_t at = kForm; at + kHead <= bytes.size();) {
         if (bytes.compare(at, 4, "data") == 0) return at + kHead;
@@ -26,7 +28,7 @@ size_t samplesAt(const std::string& file) {
     throw failure(Msg::outputUnreadable, {file});
 }
 
-void takeFormat(QvFileMuxStream& to, const QvEncoder& encoder) {
+void copyFormat(QvFileMuxStream& to, const QvEncoder& encoder) {
     const auto ask = [&](const char* name) { return static_cast<const QvCodec&>(encoder).getParam(name); };
     if (to.type == qvVideoStream) {
         if (const Any rate = ask("framerate"); rate.isFramerate()) to.framerate = rate.asFramerate();
@@ -38,15 +40,16 @@ void takeFormat(QvFileMuxStream& to, const QvEncoder& encoder) {
     }
 }
 
-// Each into the folder of the output, by its own name.
-void moveHere(std::span<const std::string> files, const std::string& output) {
+// Moves the files into the folder of the output. They keep their names.
+void moveNextTo(std::span<const std::string> files, const std::string& output) {
     const fs::path folder = fs::path(output).parent_path();
     for (const std::string& file : files) moveFile(file, (folder / fs::path(file).filename()).string());
 }
 
-class Multiplexed {
+// Multiplexes the parts as the job's own multiplexer does.
+class PartMultiplexer {
   public:
-    Multiplexed(const JobParts& parts, const PartFiles& files) : parts_(parts), files_(files) {}
+    PartMultiplexer(const JobParts& parts, const PartFiles& files) : parts_(parts), files_(files) {}
 
     bool write(const std::string& output, bool withSound, const std::function<bool(double)>& watch) {
         size_t sound = 0;
@@ -65,7 +68,7 @@ class Multiplexed {
             add(stream, std::move(data));
         }
         mux_.config().watch = watch;
-        settings();
+        setOutput();
         const int result = mux_.run(parts_.plan.output.muxer(), Any(output.c_str()));
         if (result == QvFileMux::cancelled) return false;
         if (result != 0)
@@ -77,7 +80,7 @@ class Multiplexed {
     void add(const PlannedStream& stream, std::vector<QvFilePart> data) {
         const std::string encoder = stream.encoder();
         QvFileMuxStream& to = mux_.config().addStream(stream.type, data.front().file, Any(encoder.c_str()));
-        takeFormat(to, *parts_.encoder(stream));
+        copyFormat(to, *parts_.encoder(stream));
         to.parts = std::move(data);
         const long long wanted = stream.bytes(stream.expected), found = to.length();
         if (found != wanted)
@@ -85,7 +88,7 @@ class Multiplexed {
                                                "bytes of its parts", std::to_string(wanted)});
     }
 
-    // All sounds are in one file.
+    // Adds a stream whose parts are recorded units. The units of all sounds are in one file.
     void addRecorded(const PlannedStream& stream) {
         std::vector<QvFilePart> data;
         if (stream.isVideo())
@@ -96,7 +99,7 @@ class Multiplexed {
         const std::string encoder = stream.encoder();
         QvFileMuxStream& to = mux_.config().addStream(stream.type, data.front().file, Any(encoder.c_str()));
         parts_.pipe->getMuxer()->getStreamParams(stream.type, stream.number, to.params);
-        takeFormat(to, *parts_.encoder(stream));
+        copyFormat(to, *parts_.encoder(stream));
         to.parts = std::move(data);
         to.recorded = true;
     }
@@ -105,7 +108,8 @@ class Multiplexed {
         return {Any(file.c_str()), static_cast<long long>(samplesAt(file)), stream.bytes(stream.expected)};
     }
 
-    void settings() {
+    // The multiplexer's settings are those of the job in one piece.
+    void setOutput() {
         AnyDict state;
         parts_.pipe->getMuxer()->store(state);
         for (const char* key : {"name", "displayName", "filename"}) state.remove(key);
@@ -117,7 +121,7 @@ class Multiplexed {
         mux_.config().output = state;
     }
 
-    // As a run gives it to the multiplexer.
+    // The metadata that a job in one piece hands to its multiplexer.
     Any metaOfInput() const {
         const Source& source = parts_.source(pictureOf(parts_.plan));
         return static_cast<const QvCodec&>(source.decoder()).getParam("meta");
@@ -135,14 +139,14 @@ bool joinParts(const JobParts& parts, const PartFiles& files, const std::string&
     switch (parts.plan.output.kind) {
         case OutputKind::pictures:
             for (const PartPictures& part : files.pictures)
-                moveHere(std::span(part.files)
-                             .subspan(std::min<size_t>(static_cast<size_t>(part.lead), part.files.size())),
-                         output);
-            moveHere(files.sounds, output);
+                moveNextTo(std::span(part.files)
+                               .subspan(std::min<size_t>(static_cast<size_t>(part.lead), part.files.size())),
+                           output);
+            moveNextTo(files.sounds, output);
             return true;
         case OutputKind::raw:
-            moveHere(files.sounds, output);
-            return Multiplexed(parts, files).write(output, false, watch);
-        default: return Multiplexed(parts, files).write(output, true, watch);
+            moveNextTo(files.sounds, output);
+            return PartMultiplexer(parts, files).write(output, false, watch);
+        default: return PartMultiplexer(parts, files).write(output, true, watch);
     }
 }

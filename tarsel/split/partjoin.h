@@ -1,4 +1,4 @@
-// The parts of a divided job become its output.
+// Joins the parts of a divided job into its output.
 #pragma once
 
 #include <functional>
@@ -8,17 +8,17 @@
 #include "tarsel/job/jobparts.h"
 
 struct PartPictures {
-    std::vector<std::string> files;  // one, or those of a sequence in their order
-    long long lead = 0;              // frames at their beginning that are left out
+    std::vector<std::string> files;  // one, or those of a sequence in order
+    long long lead = 0;              // frames at their beginning that don't belong to the output
 };
 
 struct PartFiles {
-    std::vector<PartPictures> pictures;  // of each part
+    std::vector<PartPictures> pictures;  // one element for each part
     std::vector<std::string> sounds;     // in the order of the streams
 };
 
-// Puts the output together under `output`, the name in the hidden folder that the multiplexer of the whole
-// would write to. `watch` gets the share that is done and returns false to stop. False if it was stopped.
-// Throws Failure, also for a part that does not have the length of its share.
+// `output`: the name that a job in one piece would write, in the hidden folder of the outputs. `watch` gets
+// the share that is done, 0 to 1, and returns false to stop. False if it was stopped. Throws Failure, also if
+// the parts do not have the expected length.
 bool joinParts(const JobParts& parts, const PartFiles& files, const std::string& output,
                const std::function<bool(double)>& watch);

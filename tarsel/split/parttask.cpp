@@ -8,9 +8,9 @@
 
 namespace {
 
-constexpr int kTiny = 2;  // pixels of a side of the picture that only counts
+constexpr int kSide = 2;  // pixels: width and height of the placeholder picture, see soundTask
 
-// What a vector under `key` has of streams of these types.
+// Removes the other streams: sound if `video`, otherwise video.
 void keepStreams(AnyDict& state, bool video) {
     AnyVector kept;
     for (const Any& stream : state.getVector("streams"))
@@ -18,8 +18,8 @@ void keepStreams(AnyDict& state, bool video) {
     state.set("streams", kept);
 }
 
-// What is put together afterwards: units of a film, or each stream in a file of its own, as it is.
-void writeParts(AnyDict& encoder, const JobPlan& plan) {
+// A part of a film is its recorded units; of other outputs, one raw file for each stream.
+void setPartOutput(AnyDict& encoder, const JobPlan& plan) {
     std::string muxer = "rawmux";
     int profile = QvProfile::raw;
     if (isFilm(plan)) {
@@ -40,8 +40,8 @@ void setOutput(AnyDict& state, AnyDict encoder, const std::string& output) {
     state.remove(kSplitKey);
 }
 
-// The first frame of the part in the numbers of the input, and as an instant of it.
-MediaTime instantOf(const JobPlan& plan, const PlannedStream& picture, long long frame) {
+// The time in the input of a frame of the output, a multiple of splitUnit: a frame of the input begins there.
+MediaTime inputTimeOf(const JobPlan& plan, const PlannedStream& picture, long long frame) {
     const QvFramerate& in = plan.source(picture).picture.rate;
     const QvRatio from = in.rate(), to = picture.picture.rate.rate();
     const long long start = QvFrameRange(picture.part.in, picture.part.out, in).start;
@@ -49,6 +49,7 @@ MediaTime instantOf(const JobPlan& plan, const PlannedStream& picture, long long
     return qvInstantOf(start + frames, from);
 }
 
+// Fades count frames from the start of the output; in a part they have to count from there, too.
 void moveFades(FiltersState& filters, long long first) {
     const AnyVector names = filters.names();
     for (int i = 0; i < filters.count(); ++i) {
@@ -61,12 +62,13 @@ void moveFades(FiltersState& filters, long long first) {
     }
 }
 
+// Limits the process to the part: its in and out points, and what filters count from the start.
 void divideProcess(ProcessParams& process, const JobPlan& plan, const SplitPlan& split, size_t part) {
     const PlannedStream& picture = pictureOf(plan);
     const long long first = split.first(part) - split.lead(part);
     const bool last = part + 1 == split.parts();
-    const MediaTime in = first == 0 ? picture.part.in : instantOf(plan, picture, first);
-    const MediaTime out = last ? picture.part.out : instantOf(plan, picture, split.points[part + 1]);
+    const MediaTime in = first == 0 ? picture.part.in : inputTimeOf(plan, picture, first);
+    const MediaTime out = last ? picture.part.out : inputTimeOf(plan, picture, split.points[part + 1]);
     process.setInOutPoints(InOutPoints(in, out));
     if (!last && process.holdLast()) process.setHoldLast(false);
     auto filters = process.filters();
@@ -80,7 +82,7 @@ void divideProcess(ProcessParams& process, const JobPlan& plan, const SplitPlan&
     process.setFilters(*filters);
 }
 
-// Some encoders write a timecode into the stream.
+// For encoders that write a timecode into the stream: that of the part's first frame.
 void moveTimecode(AnyDict& encoder, const PlannedStream& picture, long long first) {
     AnyVector streams = encoder.getVector("streams");
     AnyDict stream = streams.at(0).asDict();
@@ -99,14 +101,14 @@ void moveTimecode(AnyDict& encoder, const PlannedStream& picture, long long firs
     encoder.set("streams", streams);
 }
 
-AnyDict tinyFile(const PlannedStream& picture, const std::string& name) {
-    AnyDict decoder("name", "rawdec", "FOURCC", "I420", "width", kTiny, "height", kTiny);
+AnyDict placeholderFile(const PlannedStream& picture, const std::string& name) {
+    AnyDict decoder("name", "rawdec", "FOURCC", "I420", "width", kSide, "height", kSide);
     decoder.set("framerate", Any(picture.picture.rate));
     return AnyDict("filename", name.c_str(), "decoder", Any(decoder));
 }
 
-AnyDict tinyEncoder(const PlannedStream& picture) {
-    AnyDict settings("type", static_cast<int>(QvFourcc::I420), "width", kTiny, "height", kTiny);
+AnyDict placeholderEncoder(const PlannedStream& picture) {
+    AnyDict settings("type", static_cast<int>(QvFourcc::I420), "width", kSide, "height", kSide);
     settings.set("framerate", Any(picture.picture.rate));
     const AnyDict codec("name", "rawvenc", "settingsDict", Any(settings));
     return AnyDict("type", qvVideoStream, "codec", Any(codec), "stream", Any(AnyDict()));
@@ -139,26 +141,26 @@ AnyDict pictureTask(const AnyDict& whole, const JobPlan& plan, const SplitPlan& 
         muxer.set("allPictures", static_cast<int>(pictureOf(plan).expected));
         encoder.set("muxer", muxer);
     } else {
-        writeParts(encoder, plan);
+        setPartOutput(encoder, plan);
     }
     setOutput(state, encoder, output);
     return state;
 }
 
-long long tinyBytes(const JobPlan& plan) { return pictureOf(plan).expected * kTiny * kTiny * 3 / 2; }
+long long placeholderBytes(const JobPlan& plan) { return pictureOf(plan).expected * kSide * kSide * 3 / 2; }
 
-AnyDict soundTask(const AnyDict& whole, const JobPlan& plan, const std::string& tiny,
+AnyDict soundTask(const AnyDict& whole, const JobPlan& plan, const std::string& placeholder,
                   const std::string& output) {
     const PlannedStream& picture = pictureOf(plan);
     AnyDict state = whole;
     AnyVector files = state.getVector("files");
-    files.append(tinyFile(picture, tiny));
+    files.append(placeholderFile(picture, placeholder));
     state.set("files", files);
     AnyVector streams;
     for (const Any& one : whole.getVector("streams")) {
         AnyDict stream = one.asDict();
         if (stream.getInt32("type", 0) == qvVideoStream) {
-            AnyDict source("file", tiny.c_str(), "stream", Any(Pair(qvVideoStream, 0)), "process",
+            AnyDict source("file", placeholder.c_str(), "stream", Any(Pair(qvVideoStream, 0)), "process",
                            Any(AnyDict()));
             AnyVector sources;
             sources.append(source);
@@ -171,9 +173,10 @@ AnyDict soundTask(const AnyDict& whole, const JobPlan& plan, const std::string& 
     AnyDict encoder = state.get("encoder").asDict();
     AnyVector encoders;
     for (const Any& one : encoder.getVector("streams"))
-        encoders.append(one.asDict().getInt32("type", 0) == qvVideoStream ? Any(tinyEncoder(picture)) : one);
+        encoders.append(one.asDict().getInt32("type", 0) == qvVideoStream ? Any(placeholderEncoder(picture))
+                                                                          : one);
     encoder.set("streams", encoders);
-    writeParts(encoder, plan);
+    setPartOutput(encoder, plan);
     setOutput(state, encoder, output);
     return state;
 }

@@ -5,14 +5,15 @@
 
 #include "tarsel/split/splitplan.h"
 
-// A task of the picture's part alone. `whole`: the job as a task. `output`: the name of the part's file, or
-// that of the whole sequence's files in a folder of the part's own.
+// The task that makes one part of the picture, without sound. `whole`: the job as a task. `output`: the name
+// of the part's file; for a sequence, the name of the output in the part's own folder.
 AnyDict pictureTask(const AnyDict& whole, const JobPlan& plan, const SplitPlan& split, size_t part,
                     const std::string& output);
 
-// A task of all sounds over their whole length: what is done to sound often depends on all that came before,
-// and it costs little next to the picture. `tiny`: a file of tinyBytes, whatever they are, which is a picture
-// of the same length beside them: it makes them as long as in the whole.
-AnyDict soundTask(const AnyDict& whole, const JobPlan& plan, const std::string& tiny,
+// The task that makes all sounds in one piece: filters and encoders of sound often depend on everything
+// before, and they take little time. The expected length of sound follows from the picture, so a placeholder
+// of 2x2 pixels takes its place: `placeholder` is the name of a raw video file of placeholderBytes() with any
+// content.
+AnyDict soundTask(const AnyDict& whole, const JobPlan& plan, const std::string& placeholder,
                   const std::string& output);
-long long tinyBytes(const JobPlan& plan);
+long long placeholderBytes(const JobPlan& plan);

@@ -23,8 +23,8 @@ namespace fs = std::filesystem;
 namespace {
 
 constexpr int kLeastParts = 2, kMostParts = 10000;
-constexpr double kSoundWeight = 0.03;  // of the sound, as a share of the picture's
-constexpr double kJoinWeight = 0.05;   // of putting the parts together, as a share of all
+constexpr double kSoundWeight = 0.03;  // of the sound, relative to the picture
+constexpr double kJoinShare = 0.05;    // of joining the parts, as a share of the whole job
 
 class Split : public JobDivision {
   public:
@@ -40,23 +40,23 @@ class Split : public JobDivision {
     ProgressState now() const override;
 
   private:
-    // Ends what still runs, whatever happens.
-    struct Ended {
-        explicit Ended(Split& of) : split(of) {}
-        ~Ended() {
+    // Ends the parts that still run, also after an exception.
+    struct ExecutorEnd {
+        explicit ExecutorEnd(Split& of) : split(of) {}
+        ~ExecutorEnd() {
             const std::lock_guard guard(split.lock_);
             split.executor_.reset();
         }
-        Ended(const Ended&) = delete;
-        Ended& operator=(const Ended&) = delete;
+        ExecutorEnd(const ExecutorEnd&) = delete;
+        ExecutorEnd& operator=(const ExecutorEnd&) = delete;
         Split& split;
     };
 
     void writeTasks(const Given& given, const fs::path& folder);
-    void show(const Given& given);
+    void showProgress(const Given& given);
     std::unique_ptr<PartExecutor> makeExecutor(const Given& given) const;
-    std::vector<PartState> carryOut(const Given& given);
-    PartFiles filesOf(const std::vector<PartState>& states, const std::string& tiny) const;
+    std::vector<PartState> runParts(const Given& given);
+    PartFiles filesOf(const std::vector<PartState>& states, const std::string& placeholder) const;
 
     const int wanted_;
     const SplitPlace place_;
@@ -64,9 +64,9 @@ class Split : public JobDivision {
     SplitPlan split_;
     bool sound_ = false;
     std::vector<std::string> notes_;
-    std::vector<Part> parts_;  // those of the picture, then the sound
+    std::vector<Part> parts_;  // of the picture, then that of the sound
     std::unique_ptr<PartExecutor> executor_;
-    std::mutex lock_;  // of executor_, which signals and keys reach as well
+    std::mutex lock_;  // protects executor_: requestStop and pause come from other threads
     std::atomic<bool> stop_{false}, paused_{false};
     std::atomic<double> done_{0};
     std::atomic<long long> frames_{0};
@@ -115,13 +115,13 @@ void Split::writeTasks(const Given& given, const fs::path& folder) {
             pictureTask(given.task, plan, split_, part, output));
     }
     if (!sound_) return;
-    const std::string tiny = (folder / "tiny.i420").string();
-    makeHole(tiny, tinyBytes(plan));
+    const std::string placeholder = (folder / "placeholder.i420").string();
+    makeHole(placeholder, placeholderBytes(plan));
     add("sound", static_cast<double>(split_.points.back()) * kSoundWeight,
-        soundTask(given.task, plan, tiny, outputOf("sound", isFilm(plan) ? extension : ".raw")));
+        soundTask(given.task, plan, placeholder, outputOf("sound", isFilm(plan) ? extension : ".raw")));
 }
 
-void Split::show(const Given& given) {
+void Split::showProgress(const Given& given) {
     double whole = 0, done = 0;
     long long frames = 0;
     for (size_t i = 0; i < parts_.size(); ++i) {
@@ -130,7 +130,7 @@ void Split::show(const Given& given) {
         done += parts_[i].weight * (state.ended ? 1 : state.done);
         if (i < split_.parts()) frames += state.frames;
     }
-    done_ = done / whole * (1 - kJoinWeight);
+    done_ = done / whole * (1 - kJoinShare);
     frames_ = frames;
     if (given.progress.due()) given.progress.update(now());
 }
@@ -148,17 +148,17 @@ std::unique_ptr<PartExecutor> Split::makeExecutor(const Given& given) const {
     return std::make_unique<LocalParts>(share.atOnce, words, output);
 }
 
-// What each part has become; nothing when they were stopped.
-std::vector<PartState> Split::carryOut(const Given& given) {
+// Runs the parts to their end. Returns their final states; nothing if they were stopped.
+std::vector<PartState> Split::runParts(const Given& given) {
     {
         const std::lock_guard guard(lock_);
         executor_ = makeExecutor(given);
     }
-    const Ended ending(*this);
+    const ExecutorEnd ending(*this);
     executor_->begin(parts_);
     if (paused_) executor_->pause(true);
     if (stop_) executor_->cancel();
-    while (executor_->wait()) show(given);
+    while (executor_->wait()) showProgress(given);
     std::vector<PartState> states = executor_->states();
     if (stop_) return {};
     for (const PartState& state : states)
@@ -167,8 +167,8 @@ std::vector<PartState> Split::carryOut(const Given& given) {
     return states;
 }
 
-// Beside the sounds there is the picture that only counts.
-PartFiles Split::filesOf(const std::vector<PartState>& states, const std::string& tiny) const {
+// `placeholder`: the file of the sound task's picture, which is not used.
+PartFiles Split::filesOf(const std::vector<PartState>& states, const std::string& placeholder) const {
     PartFiles files;
     for (size_t part = 0; part < split_.parts(); ++part) {
         files.pictures.push_back({states[part].outputs, split_.lead(part)});
@@ -176,7 +176,7 @@ PartFiles Split::filesOf(const std::vector<PartState>& states, const std::string
         std::sort(names.begin(), names.end());
     }
     if (sound_) files.sounds = states.back().outputs;
-    std::erase(files.sounds, tiny);
+    std::erase(files.sounds, placeholder);
     std::sort(files.sounds.begin(), files.sounds.end());
     return files;
 }
@@ -186,14 +186,14 @@ std::vector<long long> Split::run(const Given& given) {
     makeFolder(folder.string());
     writeTasks(given, folder);
     std::vector<long long> written;
-    const std::vector<PartState> states = carryOut(given);
+    const std::vector<PartState> states = runParts(given);
     if (states.empty()) return written;
     for (const PartState& state : states)
         for (const std::string& warning : state.warnings)
             given.warnings.add(given.parts.outputs.withFinalNames(warning));
-    const std::string tiny = (folder / "sound" / fs::path(given.output).stem()).string() + ".raw";
-    const bool joined = joinParts(given.parts, filesOf(states, tiny), given.output, [&](double part) {
-        done_ = 1 - kJoinWeight + kJoinWeight * part;
+    const std::string placeholder = (folder / "sound" / fs::path(given.output).stem()).string() + ".raw";
+    const bool joined = joinParts(given.parts, filesOf(states, placeholder), given.output, [&](double part) {
+        done_ = 1 - kJoinShare + kJoinShare * part;
         if (given.progress.due()) given.progress.update(now());
         return !stop_;
     });
@@ -238,7 +238,8 @@ std::shared_ptr<JobDivision> makeSplit(const std::string& parts, const SplitPlac
     return std::make_shared<Split>(count, place);
 }
 
-// Another program may have written any number; without a division the task is made in one piece.
+// Another program may have written any number into the task: an invalid one is ignored, and the job is made
+// in one piece.
 std::shared_ptr<JobDivision> storedSplit(const StoredTask& task) {
     const int parts = task.raw().getInt32(kSplitKey, 0);
     return parts >= kLeastParts && parts <= kMostParts ? std::make_shared<Split>(parts, SplitPlace())

@@ -1,4 +1,4 @@
-// --split: a long job whose picture is made in parts, side by side.
+// --split: a long job whose picture is made in parts at the same time.
 #pragma once
 
 #include <memory>
@@ -10,12 +10,12 @@
 
 // Where the parts are made.
 struct SplitPlace {
-    bool slurm = false;                // as elements of an array, not as processes of this machine
+    bool slurm = false;                // on a cluster, as a job array; false: as processes of this machine
     std::vector<std::string> options;  // for sbatch
 };
 
-// A division of a job into so many parts, for JobOptions::division; null for "". Throws Failure (usage) for a
-// text that is no whole number from 2 on, and for a place without parts.
+// A division of a job into `parts` parts, for JobOptions::division; null for "". Throws Failure (usage) for a
+// text that is no valid number of parts (2 is the least), and for --slurm without parts.
 std::shared_ptr<JobDivision> makeSplit(const std::string& parts, const SplitPlace& place = {});
-// The one that a task asks for; null for none.
+// The division that is stored in the task; null if there is none.
 std::shared_ptr<JobDivision> storedSplit(const StoredTask& task);

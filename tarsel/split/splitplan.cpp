@@ -9,34 +9,35 @@
 
 namespace {
 
-constexpr long long mostUnit = 1'000'000'000;  // frames; no job is as long
+constexpr long long kMostUnit = 1'000'000'000;  // frames; no job is as long
 
-// The smallest count of which `num / den` times as many are whole.
+// The smallest n for which n * num / den is a whole number.
 long long wholeAt(long long num, long long den) { return den / std::gcd(num, den); }
 
-long long common(long long a, long long b) {
+// Limited to kMostUnit.
+long long leastCommonMultiple(long long a, long long b) {
     const long long factor = b / std::gcd(a, b);
-    return a > mostUnit / factor ? mostUnit : a * factor;
+    return a > kMostUnit / factor ? kMostUnit : a * factor;
 }
 
-// Modules that are told where a part begins.
-bool takesPlace(std::string_view filter) {
+// Filters that can start in the middle: parttask.cpp moves what they count from the start.
+bool isMovable(std::string_view filter) {
     return filter == "subtitle" || filter == "timecode" || filter == "videofade";
 }
 
-void requireWholeFilters(const JobPlan& plan, const PlannedStream& picture) {
+void requireDivisibleFilters(const JobPlan& plan, const PlannedStream& picture) {
     if (!plan.filterFiles.written.empty())
         throw failure(Msg::splitFilter, {plan.filterFiles.written.front().filter});
     for (const Any& name : picture.filters.names(true))
-        if (const std::string filter = name.asString(""); !takesPlace(filter) && !isDivisible(filter))
+        if (const std::string filter = name.asString(""); !isMovable(filter) && !isDivisible(filter))
             throw failure(Msg::splitFilter, {filter});
 }
 
-void requireKind(const JobPlan& plan) {
+void requireDivisibleOutput(const JobPlan& plan) {
     const OutputForm& output = plan.output;
     const bool kind = output.kind == OutputKind::raw || output.kind == OutputKind::pictures ||
                       output.kind == OutputKind::avi || isFilm(plan);
-    // Sound that no encoder makes is a part of what its multiplexer writes.
+    // Sound without an encoder exists only in what its multiplexer writes, so it can't be made as a part.
     const auto isBare = [](const PlannedStream& stream) {
         return stream.encoder() == std::string_view("dummyaenc");
     };
@@ -45,15 +46,16 @@ void requireKind(const JobPlan& plan) {
     if (plan.count(qvVideoStream) != 1) throw failure(Msg::splitPictures, {output.name});
 }
 
-// Frames of the output in front of the last one that an input gives; those that are held come after it.
-long long ownFrames(const JobPlan& plan, const PlannedStream& picture) {
+// Frames of the output up to the end of the input. After that its last frame may be repeated, by the last
+// part.
+long long framesOfInput(const JobPlan& plan, const PlannedStream& picture) {
     const QvFramerate& rate = plan.source(picture).picture.rate;
     QvFrameRange range(picture.part.in, std::min(picture.part.out, plan.source(picture).end()), rate);
     if (!range.empty()) range.convert(rate, picture.picture.rate);
     return std::min<long long>(range.out, picture.expected);
 }
 
-// Frames of the input.
+// Frames of the input that the filter needs before the first one that is used.
 long long prerollOf(const std::string& filter) {
     const QvModule* const module = qv_registry()->module(filter.c_str());
     return module ? std::max(module->getAttr("preroll").asInt32(0), 0) : 0;
@@ -65,14 +67,14 @@ long long prerollOf(const PlannedStream& picture) {
     return frames;
 }
 
-// "" if there is none. Pictures that are only there to fill its memory can't be cut off where
-// others depend on them.
-std::string rememberingFilter(const PlannedStream& picture) {
+// A filter that needs a lead-in; "": none.
+std::string filterWithPreroll(const PlannedStream& picture) {
     for (const Any& name : picture.filters.names(true))
         if (prerollOf(name.asString("")) > 0) return name.asString("");
     return "";
 }
 
+// The preroll of all filters in frames of the output, rounded up to the unit.
 long long leadOf(const JobPlan& plan, const PlannedStream& picture, long long unit) {
     const QvRatio out = picture.picture.rate.rate(), in = plan.source(picture).picture.rate.rate();
     const long long inUnit =
@@ -106,7 +108,8 @@ long long splitUnit(const JobPlan& plan) {
         wholeAt(static_cast<long long>(in.num) * out.den, static_cast<long long>(in.den) * out.num);
     for (const PlannedStream& stream : plan.streams)
         if (!stream.isVideo())
-            unit = common(unit, wholeAt(static_cast<long long>(stream.sound.samplerate) * out.den, out.num));
+            unit = leastCommonMultiple(
+                unit, wholeAt(static_cast<long long>(stream.sound.samplerate) * out.den, out.num));
     return unit;
 }
 
@@ -117,18 +120,19 @@ PartShare shareOf(size_t parts, int cores, int threads, int processors) {
 }
 
 SplitPlan planSplit(const JobPlan& plan, int parts) {
-    requireKind(plan);
+    requireDivisibleOutput(plan);
     const PlannedStream& picture = pictureOf(plan);
-    requireWholeFilters(plan, picture);
-    if (const std::string filter = isFilm(plan) && !isCodedAlone(picture) ? rememberingFilter(picture) : "";
+    requireDivisibleFilters(plan, picture);
+    // Coded pictures of the lead-in can't be dropped if later ones depend on them.
+    if (const std::string filter = isFilm(plan) && !isCodedAlone(picture) ? filterWithPreroll(picture) : "";
         !filter.empty())
         throw failure(Msg::splitFilter, {filter});
-    const long long unit = splitUnit(plan), own = ownFrames(plan, picture);
+    const long long unit = splitUnit(plan), available = framesOfInput(plan, picture);
     SplitPlan split;
     split.points = {0};
     for (int part = 1; part < parts; ++part) {
-        const long long wanted = (own * part / parts + unit / 2) / unit * unit;
-        if (wanted > split.points.back() && wanted < own) split.points.push_back(wanted);
+        const long long wanted = (available * part / parts + unit / 2) / unit * unit;
+        if (wanted > split.points.back() && wanted < available) split.points.push_back(wanted);
     }
     split.points.push_back(picture.expected);
     split.leadIn = leadOf(plan, picture, unit);

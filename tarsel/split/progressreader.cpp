@@ -1,4 +1,4 @@
-#include "tarsel/split/tasktalk.h"
+#include "tarsel/split/progressreader.h"
 
 #include "tarsel/words/failure.h"
 #include "tarsel/words/json.h"
@@ -17,15 +17,15 @@ std::string textOf(const Json& object, const char* key) {
 
 }  // namespace
 
-void TaskTalk::hear(const std::string& text) {
-    heard_ += text;
+void ProgressReader::add(const std::string& text) {
+    rest_ += text;
     size_t at = 0;
-    for (size_t end; (end = heard_.find('\n', at)) != std::string::npos; at = end + 1)
-        take(heard_.substr(at, end - at));
-    heard_.erase(0, at);
+    for (size_t end; (end = rest_.find('\n', at)) != std::string::npos; at = end + 1)
+        take(rest_.substr(at, end - at));
+    rest_.erase(0, at);
 }
 
-void TaskTalk::take(const std::string& line) {
+void ProgressReader::take(const std::string& line) {
     const Json object = Json::parse(line, nullptr, false);
     if (!object.is_object()) {
         failure_ = inLine(line);
@@ -36,8 +36,8 @@ void TaskTalk::take(const std::string& line) {
         if (textOf(object, "level") == "warning") warnings_.push_back(textOf(object, "text"));
         return;
     }
-    const double percent = numberOf(object, "percent", part_ * 100);
-    part_ = percent / 100;
+    const double percent = numberOf(object, "percent", done_ * 100);
+    done_ = percent / 100;
     speed_ = numberOf(object, "speed", speed_);
     frames_ = static_cast<long long>(numberOf(object, "frame", 0));
     outSeconds_ = numberOf(object, "out_time_us", 0) / 1e6;
