@@ -24,6 +24,12 @@ void QvIoFailure::report(int code, const char* what, const QvWideString& name) {
 
 void QvIoFailure::note(int code, const char* what, const QvWideString& name) { keep(code, what, name); }
 
+void QvIoFailure::take(int code, const std::string& text) {
+    if (code_) return;
+    text_ = text;
+    code_ = code ? code : EIO;
+}
+
 void QvIoFailure::clear() {
     code_ = 0;
     text_.clear();

@@ -17,6 +17,8 @@ class QV_API QvIoFailure {
     // (ECANCELED); note() does not.
     void report(int code, const char* what, const QvWideString& name);
     void note(int code, const char* what, const QvWideString& name);
+    // The same for a whole sentence, as the failure of the stream that this one writes through.
+    void take(int code, const std::string& text);
     void clear();
 
     int code() const { return code_; }

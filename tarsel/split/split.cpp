@@ -54,6 +54,7 @@ class Split : public JobDivision {
 
     void writeTasks(const Given& given, const fs::path& folder);
     void showProgress(const Given& given);
+    std::string inNamesOfJob(const Given& given, std::string text) const;
     std::unique_ptr<PartExecutor> makeExecutor(const Given& given) const;
     std::vector<PartState> runParts(const Given& given);
     PartFiles filesOf(const std::vector<PartState>& states, const std::string& placeholder) const;
@@ -64,7 +65,8 @@ class Split : public JobDivision {
     SplitPlan split_;
     bool sound_ = false;
     std::vector<std::string> notes_;
-    std::vector<Part> parts_;  // of the picture, then that of the sound
+    std::vector<Part> parts_;               // of the picture, then that of the sound
+    std::vector<std::string> partOutputs_;  // names of their files
     std::unique_ptr<PartExecutor> executor_;
     std::mutex lock_;  // protects executor_: requestStop and pause come from other threads
     std::atomic<bool> stop_{false}, paused_{false};
@@ -98,7 +100,7 @@ void Split::writeTasks(const Given& given, const fs::path& folder) {
     const std::string stem = fs::path(given.output).stem().string();
     const auto outputOf = [&](const std::string& name, const std::string& end) {
         makeFolder((folder / name).string());
-        return (folder / name / stem).string() + end;
+        return partOutputs_.emplace_back((folder / name / stem).string() + end);
     };
     const auto add = [&](const std::string& name, double weight, const AnyDict& task) {
         const std::string file = (folder / (name + ".xml")).string(), reason = writeTask(task, file);
@@ -106,6 +108,7 @@ void Split::writeTasks(const Given& given, const fs::path& folder) {
         parts_.push_back({file, weight});
     };
     parts_.clear();
+    partOutputs_.clear();
     const std::string extension = isFilm(plan) ? fs::path(given.output).extension().string()
                                   : plan.output.kind == OutputKind::pictures ? ".png"
                                                                              : ".raw";
@@ -148,6 +151,15 @@ std::unique_ptr<PartExecutor> Split::makeExecutor(const Given& given) const {
     return std::make_unique<LocalParts>(share.atOnce, words, output);
 }
 
+// What a part says of its own output, as it concerns that of the job.
+std::string Split::inNamesOfJob(const Given& given, std::string text) const {
+    const std::string& shown = given.parts.plan.output.name;
+    for (const std::string& own : partOutputs_)
+        for (size_t at = 0; (at = text.find(own, at)) != std::string::npos; at += shown.size())
+            text.replace(at, own.size(), shown);
+    return given.parts.outputs.withFinalNames(text);
+}
+
 // Runs the parts to their end. Returns their final states; nothing if they were stopped.
 std::vector<PartState> Split::runParts(const Given& given) {
     {
@@ -163,7 +175,7 @@ std::vector<PartState> Split::runParts(const Given& given) {
     if (stop_) return {};
     for (const PartState& state : states)
         if (!state.failure.empty())
-            throw Failure(static_cast<Exit>(state.status), given.parts.outputs.withFinalNames(state.failure));
+            throw Failure(static_cast<Exit>(state.status), inNamesOfJob(given, state.failure));
     return states;
 }
 
@@ -189,8 +201,7 @@ std::vector<long long> Split::run(const Given& given) {
     const std::vector<PartState> states = runParts(given);
     if (states.empty()) return written;
     for (const PartState& state : states)
-        for (const std::string& warning : state.warnings)
-            given.warnings.add(given.parts.outputs.withFinalNames(warning));
+        for (const std::string& warning : state.warnings) given.warnings.add(inNamesOfJob(given, warning));
     const std::string placeholder = (folder / "sound" / fs::path(given.output).stem()).string() + ".raw";
     const bool joined = joinParts(given.parts, filesOf(states, placeholder), given.output, [&](double part) {
         done_ = 1 - kJoinShare + kJoinShare * part;

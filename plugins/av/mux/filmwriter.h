@@ -54,7 +54,7 @@ class FilmWriter {
     bool failed() const { return failed_; }
     // Of the first failure; the sink's own reason if it is one of the output.
     const std::string& problem() const { return problem_; }
-    bool outputFailed() const { return bytes_.failed(); }
+    int outputError() const { return bytes_.error(); }  // of the system; 0 where the output took everything
 
   private:
     struct Free {

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <array>
+#include <cerrno>
 #include <new>
 
 #include "core/stream/qvbufstrm.h"
@@ -32,8 +33,8 @@ SinkBytes::~SinkBytes() {
 }
 
 bool SinkBytes::fail(const char* what) {
-    if (failed_) return false;
-    failed_ = true;
+    if (failed()) return false;
+    error_ = output_.ioError() != 0 ? output_.ioError() : EIO;
     problem_ = output_.ioErrorText();
     if (problem_.empty()) problem_ = what;
     return false;
@@ -60,7 +61,7 @@ std::int64_t SinkBytes::seekBytes(void* self, std::int64_t offset, int origin) {
 }
 
 bool SinkBytes::write(const std::uint8_t* data, std::int64_t bytes) {
-    if (failed_) return false;
+    if (failed()) return false;
     const bool continues = !corrections_.empty() && position_ == endOfLast();
     if (position_ < end_ || (position_ > end_ && continues)) {
         correct(data, bytes);
@@ -105,7 +106,7 @@ void SinkBytes::correct(const std::uint8_t* data, std::int64_t bytes) {
 }
 
 bool SinkBytes::moveFromGap() {
-    if (failed_ || gapBytes_ < 8) return false;
+    if (failed() || gapBytes_ < 8) return false;
     const auto found =
         std::find_if(corrections_.rbegin(), corrections_.rend(),
                      [this](const Correction& correction) { return correction.position == gapStart_; });
@@ -120,7 +121,7 @@ bool SinkBytes::moveFromGap() {
 
 bool SinkBytes::finish() {
     for (Correction& correction : corrections_) {
-        if (failed_) return false;
+        if (failed()) return false;
         auto& bytes = correction.bytes;
         const std::int64_t inside = end_ - correction.position;
         if (inside < static_cast<std::int64_t>(bytes.size())) {
@@ -134,7 +135,7 @@ bool SinkBytes::finish() {
             return fail("The output can't be corrected; write it with seekable=0");
     }
     corrections_.clear();
-    return !failed_;
+    return !failed();
 }
 
 }  // namespace av

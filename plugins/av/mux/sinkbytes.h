@@ -32,7 +32,8 @@ class SinkBytes {
     // Hands the corrections over. False after any failure.
     bool finish();
 
-    bool failed() const { return failed_; }
+    bool failed() const { return error_ != 0; }
+    int error() const { return error_; }  // of the system, as that of the output; 0 for none
     const std::string& problem() const { return problem_; }
 
   private:
@@ -46,7 +47,7 @@ class SinkBytes {
     std::int64_t position_ = 0, end_ = 0;
     std::int64_t gapStart_ = 0, gapBytes_ = 0;
     std::vector<Correction> corrections_;
-    bool failed_ = false;
+    int error_ = 0;
     std::string problem_;
 
     static int writeBytes(void* self, std::uint8_t* data, int bytes);

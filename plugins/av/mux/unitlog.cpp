@@ -59,6 +59,8 @@ std::vector<std::uint8_t> UnitDigest::finish() {
 
 UnitLog::UnitLog(QvBufStream& output) : output_(output) {}
 
+int UnitLog::error() const { return output_.ioError(); }
+
 bool UnitLog::put(std::span<const std::uint8_t> bytes) {
     if (!problem_.empty() || bytes.empty()) return problem_.empty();
     digest_.add(bytes);

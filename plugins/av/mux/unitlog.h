@@ -50,10 +50,11 @@ class UnitLog {
   public:
     explicit UnitLog(QvBufStream& output);
 
-    // Both: false after any failure, with a text in problem().
+    // Both: false after any failure, with a text in problem() and the system's number in error().
     bool add(const UnitLogEntry& entry);
     bool finish();  // no entry follows
     const std::string& problem() const { return problem_; }
+    int error() const;
 
   private:
     QvBufStream& output_;

@@ -221,10 +221,10 @@ class UnitStream::FilmRecord final : public Record {
 
     // Whoever writes reads the reason from the stream.
     void noteFailure() {
+        if (const int error = film_.outputError()) return stream_.failure()->take(error, film_.problem());
         const Any name = stream_.getParam("outfilename");
-        const auto code = film_.outputFailed() ? EIO : EINVAL;
-        if (!film_.outputFailed()) static_cast<Multiplexer*>(stream_.owner())->refuse(film_.problem());
-        stream_.failure()->note(code, film_.problem().c_str(),
+        static_cast<Multiplexer*>(stream_.owner())->refuse(film_.problem());
+        stream_.failure()->note(EINVAL, film_.problem().c_str(),
                                 name.isText() ? qv_wide_name(qv_os_name(name)) : QvWideString());
     }
 };
@@ -288,14 +288,8 @@ class UnitStream::LogRecord final : public Record {
         const bool ok = log_.add(entry_);
         entry_.info.clear();
         filled_ = 0;
-        if (!ok) fail(EIO, log_.problem());
+        if (!ok) stream_.failure()->take(log_.error(), log_.problem());
         return ok;
-    }
-
-    void fail(int code, const std::string& problem) {
-        const Any name = stream_.getParam("outfilename");
-        stream_.failure()->note(code, problem.c_str(),
-                                name.isText() ? qv_wide_name(qv_os_name(name)) : QvWideString());
     }
 
     // Its own data take the place of the unit's bytes, as the address says nothing in another process.

@@ -144,6 +144,28 @@ TEST_F(FilmJobs, areRefusedWithTheEncodersOwnReason) {
 }
 
 // Sound and pictures of a film in fragments begin together, and all of its units are counted.
+// The system's own reason, and the name that the user gave, from whichever thread, process or stream it
+// comes.
+TEST_F(FilmJobs, sayWhyTheirOutputTakesNoMore) {
+    const std::pair<std::string, std::string> films[] = {
+        {"prores", "a.mov"}, {"ffv1", "b.mkv"}, {"ffv1", "c.avi"}};
+    ProcessOptions options;
+    options.folder = folder.path().string();
+    for (const auto& [codec, name] : films)
+        for (const char* more : {"", " --split 2"}) {
+            const std::string command = "ulimit -f 300; exec " QV_BINARY_DIR
+                                        "/bin/tarsel transcode testgen:size=320x240,rate=25,duration=4 -y -q "
+                                        "--vcodec " +
+                                        codec + " -o " + name + more;
+            const Outcome failed = runProgram({"/bin/sh", "-c", command}, options);
+            EXPECT_EQ(failed.status, 4) << name << more;
+            EXPECT_EQ(failed.err, "tarsel: can't write '" + name +
+                                      "': the file is larger than the disk or a limit of the system allows; "
+                                      "choose another disk, or raise the limit (ulimit -f)\n");
+        }
+    EXPECT_TRUE(std::filesystem::is_empty(folder.path()));
+}
+
 TEST_F(FilmJobs, beginTogetherInFragments) {
     for (const char* options :
          {"frag_duration=100000", "movflags=frag_keyframe", "movflags=+frag_every_frame"})
