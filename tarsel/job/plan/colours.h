@@ -8,6 +8,6 @@ bool isWide(const Colours& colours);
 
 // The description of pictures that are encoded as `out`; empty where the encoder's default for their height
 // is right. `converted`: they pass the engine's scaler, which knows BT.601 (below 720 lines) and BT.709 only.
-// It changes values from one to the other; where it has no such change to make, a film of another matrix
-// keeps its description.
+// If it converts from one to the other, the film's description no longer holds; otherwise it does, whatever
+// the film's matrix.
 Colours coloursOf(const PictureFormat& in, const PictureFormat& out, bool converted);
