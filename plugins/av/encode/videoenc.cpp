@@ -127,11 +127,10 @@ AVPixelFormat VideoEnc::layout() const {
     return AV_PIX_FMT_YUV420P;
 }
 
-std::string VideoEnc::prepare() {
+// What is wrong with them; "" if nothing is.
+std::string VideoEnc::checkSettings() const {
     const VideoSettings& s = settings_;
     const VideoCodec& codec = *s.codec;
-    const AVCodec* const library = codec.library();
-    if (!library) return std::string("The installed library has no encoder ") + codec.encoder;
     if (s.width < 1 || s.height < 1) return "No size of the picture is set";
     if (!s.hasRate) return "No frame rate is set";
     const int least = std::min(codec.minSide, 16);
@@ -146,6 +145,15 @@ std::string VideoEnc::prepare() {
     if (s.isInterlaced() && !s.supportsFields())
         return "The codec takes two fields a picture in 4:2:2 of 1920x1080 only";
     if (s.twoPass && !s.passRecord) return "There are no statistics of a first pass";
+    return "";
+}
+
+std::string VideoEnc::prepare() {
+    const VideoSettings& s = settings_;
+    const VideoCodec& codec = *s.codec;
+    const AVCodec* const library = codec.library();
+    if (!library) return std::string("The installed library has no encoder ") + codec.encoder;
+    if (std::string fault = checkSettings(); !fault.empty()) return fault;
     context_.reset(avcodec_alloc_context3(library));
     packet_.reset(av_packet_alloc());
     if (!context_ || !packet_) return "Out of memory";

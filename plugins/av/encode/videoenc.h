@@ -52,6 +52,7 @@ class VideoEnc : public QvVideoEncoder {
 
     int fail(const std::string& why);
     bool carryCaptions(const QvFrame& frame, AVFrame& picture);
+    std::string checkSettings() const;
     std::string prepare();
     std::string refusal(int code) const;
     std::string configure(AVPixelFormat layout);
