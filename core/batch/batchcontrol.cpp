@@ -3,7 +3,7 @@
 #include "core/arch/qvassert.h"
 #include "core/transcode/run/qvtranscoder.h"
 
-// --- The life of a run.
+// --- Begin and end of a run.
 
 void BatchControl::start(bool synchronous) {
     synchronous_ = synchronous;
@@ -68,7 +68,7 @@ void BatchControl::requestStop() {
     const std::lock_guard guard(lock_);
     pauseRequested_ = false;
     stopRequested_ = true;
-    if (current_) current_->requestStop();
+    if (stopTarget_) stopTarget_->requestStop();
     changed_.notify_all();
 }
 
@@ -96,13 +96,13 @@ void BatchControl::waitForResume() {
     paused_ = false;
 }
 
-BatchControl::Current::Current(BatchControl& control, QvTranscoder& transcoder) : control_(control) {
+BatchControl::StopTarget::StopTarget(BatchControl& control, QvTranscoder& transcoder) : control_(control) {
     const std::lock_guard guard(control_.lock_);
-    control_.current_ = &transcoder;
+    control_.stopTarget_ = &transcoder;
     if (control_.stopRequested_) transcoder.requestStop();
 }
 
-BatchControl::Current::~Current() {
+BatchControl::StopTarget::~StopTarget() {
     const std::lock_guard guard(control_.lock_);
-    control_.current_ = nullptr;
+    control_.stopTarget_ = nullptr;
 }

@@ -1,7 +1,7 @@
 // What the threads of a batch processor share: the state of the run, and requests to stop and to pause it.
 //
-// All of it is changed under one lock; what is asked for often is also readable without. One condition wakes
-// the threads that wait for the end of a pause or of a run.
+// All of it changes under one lock. What is read often is atomic and read without the lock. One condition
+// wakes the threads that wait for the end of a pause or of a run.
 #pragma once
 
 #include <atomic>
@@ -13,11 +13,11 @@ class QvTranscoder;
 
 class BatchControl {
   public:
-    // --- The life of a run. It ends in two steps: leave() says that no task will follow, and the callback of
-    // that may still be under way until end().
+    // --- Begin and end of a run. It ends in two steps: after leave() no task follows, but the last callback
+    // may still be running until end().
 
-    void begin(
-        bool synchronous);  // asserts that nothing runs; waits for the last callback of the previous run
+    // Asserts that no run is under way. Waits for the last callback of the previous one.
+    void begin(bool synchronous);
     // On the thread that runs the tasks. True if it had to begin the run itself.
     bool enter();
     void leave();
@@ -28,18 +28,18 @@ class BatchControl {
     bool onRunThread() const;
 
     std::atomic<int> task{0};
-    std::atomic<int> segment{0};  // with disabled ones counted
+    std::atomic<int> segment{0};  // disabled segments are counted
 
     // --- Stop and pause
 
     void requestStop();
-    // Between runs: a request that came too late is not for the next run.
+    // Forgets requests that came after the end of a run, so that they don't affect the next one.
     void dropRequests();
     bool stopping() const { return stopRequested_; }
     void pause(bool on);
     bool paused() const { return paused_; }
-    // Holds this thread while a pause lasts, and is true if there was one. `report` gets true before and
-    // false after it. A stop ends it.
+    // Blocks during a pause, which a stop also ends. True if there was one; then `report` was called with
+    // true before it and with false after it.
     template <class Report>
     bool waitWhilePaused(Report report) {
         if (!beginPause()) return false;
@@ -49,20 +49,21 @@ class BatchControl {
         return true;
     }
 
-    // While it lives a stop also goes to the transcoder, where it ends the wait for the reader of an output.
-    class Current {
+    // While it exists, requestStop() also stops the transcoder, which may be waiting for the reader of an
+    // output.
+    class StopTarget {
       public:
-        Current(BatchControl& control, QvTranscoder& transcoder);
-        Current(const Current&) = delete;
-        Current& operator=(const Current&) = delete;
-        ~Current();
+        StopTarget(BatchControl& control, QvTranscoder& transcoder);
+        StopTarget(const StopTarget&) = delete;
+        StopTarget& operator=(const StopTarget&) = delete;
+        ~StopTarget();
 
       private:
         BatchControl& control_;
     };
 
   private:
-    enum class Life { idle, begun, entered, left };
+    enum class Life { idle, begun, entered, left };  // after end(), begin(), enter(), leave()
 
     bool beginPause();
     void waitForResume();
@@ -72,7 +73,7 @@ class BatchControl {
     std::condition_variable changed_;
     Life life_ = Life::idle;
     std::thread::id runThread_;
-    QvTranscoder* current_ = nullptr;
+    QvTranscoder* stopTarget_ = nullptr;
     std::atomic<bool> running_{false};
     std::atomic<bool> synchronous_{false};
     std::atomic<bool> paused_{false};

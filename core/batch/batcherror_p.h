@@ -1,4 +1,4 @@
-// The last failure of a batch processor: code and text, set by the thread that runs and asked for by any.
+// The last failure of a batch processor, code and text. Any thread may set and read it.
 #pragma once
 
 #include <cstdarg>
@@ -11,10 +11,10 @@ class BatchError {
   public:
     static constexpr int maxLength = 511;
 
-    // At most maxLength characters, and a line in the debug log.
+    // The text is cut to maxLength characters. Writes a line to the debug log.
     void set(int code, const char* format, va_list args) QV_PRINTF(3, 0);
     void set(int code, const char* format, ...) QV_PRINTF(3, 4);
-    void copy(int code, const char* text);  // of a failure that is in the log already
+    void copy(int code, const char* text);  // without a line in the log
     int code() const;
     std::string text() const;
 

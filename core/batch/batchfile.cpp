@@ -22,14 +22,14 @@ int refuse(const char* text) {
     return QvStatus::failed;
 }
 
-// A name next to a file that no other process takes.
+// A random name next to the file.
 std::string temporaryName(const std::string& file) {
     char mark[24];
     std::snprintf(mark, sizeof mark, ".%08x.tmp", qv_platform().randomBits());
     return file + mark;
 }
 
-bool isOnDisc(const std::string& file) {
+bool syncToDisc(const std::string& file) {
     QvPlatform& system = qv_platform();
     std::FILE* const written = system.openFile(file.c_str(), "rb");
     if (!written) return false;
@@ -37,15 +37,15 @@ bool isOnDisc(const std::string& file) {
     return std::fclose(written) == 0 && synced;
 }
 
-// A document in place of a file that exists. It is on the disc before it takes the place: a power cut leaves
-// one of the two. Throws QvFileException.
+// Writes the document next to the existing file, and on the disc, before it is renamed: after a power cut
+// there is either the old file or the new one. Throws QvFileException.
 int replaceFile(const Any& file, const AnyDict& list) {
     const std::string name = qv_os_name(file), fresh = temporaryName(name);
     const Any target = qv_any_name(fresh, file);
     int result = QvStatus::failed;
     try {
         result = XmlParser::storeDict(target, list, doctype, version);
-        if (result == QvStatus::ok && !isOnDisc(fresh))
+        if (result == QvStatus::ok && !syncToDisc(fresh))
             throw QvFileException("Can not bring the new file to the disc");
         if (result == QvStatus::ok && qv_platform().moveFile(fresh.c_str(), name.c_str(), true) != 0)
             throw QvFileException("Can not replace the file by what was written next to it");
@@ -56,17 +56,19 @@ int replaceFile(const Any& file, const AnyDict& list) {
     return result;
 }
 
-// Elements of a vector that are dictionaries, under a key of a dictionary.
+// The vector under a key; null if there is none.
 AnyVector* vectorIn(AnyDict& dict, const char* key) {
     Any& found = dict.get(key);
     return found.isVector() ? &found.asVector() : nullptr;
 }
 
+// Likewise, the dictionary.
 AnyDict* dictIn(AnyDict& dict, const char* key) {
     Any& found = dict.get(key);
     return found.isDict() ? &found.asDict() : nullptr;
 }
 
+// Replaces the name of a codec that is not installed, if it has a substitute.
 void substitute(AnyDict& codec) {
     const Any name = codec.get("name");
     if (!name.isString() || qv_registry()->module(name.asString())) return;

@@ -11,6 +11,6 @@ class AnyVector;
 int qvWriteBatchFile(const Any& file, const AnyDict& list);
 
 // Reads the tasks: 0, QvStatus::cannotParse or QvStatus::failed, with a line in the debug log. An element
-// that is no dictionary makes the whole file a failure; what a dictionary holds is looked at when it is run.
-// Encoders that are not installed have given way to those that can stand in for them.
+// that is no dictionary makes the whole file a failure; what a dictionary holds is checked when it is run.
+// Encoders that are not installed are replaced by their substitutes.
 int qvReadBatchFile(const Any& file, AnyVector& tasks);

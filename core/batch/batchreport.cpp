@@ -9,7 +9,7 @@
 
 namespace {
 
-// Empty where there is no message, or no memory for one.
+// Empty without a message, and if there is no memory for it.
 AnyDict infoOf(const char* message) {
     try {
         if (message && *message) return AnyDict("msg", message);
@@ -31,9 +31,9 @@ void BatchReport::segmentFinished(int task, int segment, int code, const char* m
     tell([&](QvBatchProcessCb& callback) { callback.segmentFinished(task, segment, code, infoOf(message)); });
 }
 
-void BatchReport::breakOff() {
+void BatchReport::handleException() {
     const FailureText failure = qvCurrentFailure();
-    if (!broken_) error_.set(failure.code, "A callback failed: %s", failure.text);
-    broken_ = true;
+    if (!failed_) error_.set(failure.code, "A callback failed: %s", failure.text);
+    failed_ = true;
     control_.requestStop();
 }

@@ -1,5 +1,5 @@
-// The callbacks of a batch, guarded: what one of them throws becomes the processor's error and ends the run
-// as a stop does. The calls that end a task and the run are still made.
+// Calls the callbacks of a batch. An exception from one of them becomes the processor's error and ends the
+// run as a stop does; taskFinished and batchFinished are still called.
 #pragma once
 
 #include "core/batch/qvbatchprocessor.h"
@@ -14,7 +14,7 @@ class BatchReport {
         : control_(control), error_(error), callback_(callback) {}
 
     bool hasReceiver() const { return callback_ != nullptr; }
-    bool broken() const { return broken_; }  // a callback has thrown
+    bool failed() const { return failed_; }  // whether a callback has thrown
 
     // Calls `call(QvBatchProcessCb&)` if there is a receiver.
     template <class Call>
@@ -23,17 +23,17 @@ class BatchReport {
         try {
             call(*callback_);
         } catch (...) {
-            breakOff();
+            handleException();
         }
     }
     void taskFinished(int task, int code, const char* message);
     void segmentFinished(int task, int segment, int code, const char* message);
 
   private:
-    void breakOff();  // within a catch
+    void handleException();  // to be called in a catch block
 
     BatchControl& control_;
     BatchError& error_;
     QvBatchProcessCb* callback_;
-    bool broken_ = false;
+    bool failed_ = false;
 };

@@ -19,7 +19,7 @@
 
 namespace {
 
-// What a task consists of while it runs; each part goes before those that it points to.
+// The objects of a running task. The task refers to the pipe and the decoders, so it is destroyed first.
 struct Parts {
     Parts() = default;
     Parts(const Parts&) = delete;
@@ -39,7 +39,8 @@ bool isDisabled(const Any& stored) {
     return stored.isDict() && !QvTaskState(AnyDict("enabled", stored.asDict().get("enabled"))).isEnabled();
 }
 
-// A long video reports every 100 frames, all else every percent.
+// The setting "progress" of the transcoder: a long video reports every 100 frames, everything else every
+// percent.
 AnyDict progressOf(const QvBatchTask& task) {
     constexpr int longVideo = 1000, interval = 100;  // frames
     const TransLink* video = task.getLink(qvVideoStream, 0);
@@ -77,7 +78,7 @@ void BatchTaskRun::finish(int code, const char* message) {
     batch_.report.taskFinished(index_, code, message);
 }
 
-int BatchTaskRun::refuse(int code, const char* text) {
+int BatchTaskRun::failRestore(int code, const char* text) {
     qv_dbg()->error("BatchProcessor: Failed to restore task #%d from state.", index_);
     batch_.error.copy(code, text);
     finish(QvBatchProcessCb::taskFailed, text);
@@ -88,7 +89,7 @@ int BatchTaskRun::restoreAndRun(const Any& stored) {
     qv_dbg()->debug("BatchProcessor: Restoring task #%d from state...", index_);
     if (const std::string fault = qvTaskStateFault(stored); !fault.empty()) {
         qv_dbg()->error("%s", fault.c_str());
-        return refuse(QvStatus::invalidStructure, fault.c_str());
+        return failRestore(QvStatus::invalidStructure, fault.c_str());
     }
     Parts parts;
     QvEncodePipe* pipe = nullptr;
@@ -97,13 +98,13 @@ int BatchTaskRun::restoreAndRun(const Any& stored) {
         result = parts.task->restore(QvTaskState(stored.asDict()), parts.decoders, &pipe, batch_.options);
         parts.pipe.reset(pipe);
         if (result != QvStatus::ok && result != QvStatus::warning)
-            return refuse(result, parts.task->errorDesc());
+            return failRestore(result, parts.task->errorDesc());
     } catch (...) {
         const FailureText failure = qvCurrentFailure();
-        return refuse(failure.code, failure.text);
+        return failRestore(failure.code, failure.text);
     }
     const Segments segments = reportSegments(*parts.task);
-    if (segments.open == 0) return nothingOpen(segments);
+    if (segments.open == 0) return failWithoutSegments(segments);
     transcode(*parts.task, segments);
     return QvStatus::ok;
 }
@@ -122,7 +123,7 @@ BatchTaskRun::Segments BatchTaskRun::reportSegments(const QvBatchTask& task) {
     return segments;
 }
 
-int BatchTaskRun::nothingOpen(const Segments& segments) {
+int BatchTaskRun::failWithoutSegments(const Segments& segments) {
     if (segments.failed > 0)
         batch_.error.set(QvStatus::failed, "Failed to open required input file(s)");
     else
@@ -142,7 +143,7 @@ void BatchTaskRun::transcode(QvBatchTask& task, const Segments& segments) {
     int result = QvStatus::failed;
     std::string message;
     try {
-        const BatchControl::Current current(batch_.control, transcoder);
+        const BatchControl::StopTarget target(batch_.control, transcoder);
         result = transcoder.transcode(true);
         if (transcoder.errorCode() != QvStatus::ok) message = transcoder.errorDesc();
     } catch (...) {
@@ -157,13 +158,13 @@ void BatchTaskRun::transcode(QvBatchTask& task, const Segments& segments) {
 }
 
 int BatchTaskRun::resultCode(const BatchTranscoder& transcoder, int result) {
-    // A stop also ends what can take long while a run is opened: sound that is read ahead, the wait for the
-    // reader of the output. That the run could not be opened then is no failure.
+    // A stop also ends steps before the first round of work that can take long: reading sound ahead, waiting
+    // for the reader of the output. If the run could not be opened because of that, it is no failure.
     const bool stopped = batch_.control.stopping();
     if (result == QvStatus::ok || result == QvStatus::warning) {
-        // The transcoder of a run that went well keeps a warning.
+        // After a successful run this is a warning.
         if (transcoder.errorCode() != QvStatus::ok) qv_dbg()->warning("%s", transcoder.errorDesc());
-    } else if (!stopped || transcoder.worked()) {
+    } else if (!stopped || transcoder.hasWorked()) {
         qv_dbg()->error("[BatchProcessor] Task #%d: transcoding failed.", index_);
         if (transcoder.errorCode() != QvStatus::ok) batch_.error.copy(result, transcoder.errorDesc());
         return QvBatchProcessCb::taskFailed;

@@ -17,15 +17,15 @@ struct BatchContext {
     BatchError& error;
     BatchReport& report;
     int options;                           // bits of QvBatchTask
-    const std::atomic<bool>& smartRender;  // as it is when a task begins
+    const std::atomic<bool>& smartRender;  // read when a task begins
 };
 
 class BatchTaskRun {
   public:
     BatchTaskRun(BatchContext& batch, int index) : batch_(batch), index_(index) {}
 
-    // 0 also for a task that was skipped, and for one whose run failed: only taskFinished has the code.
-    // Otherwise why it could not be begun. Does not throw.
+    // 0 if the task was begun or skipped; otherwise why it could not be begun. The result of its run is
+    // reported by taskFinished alone. Does not throw.
     int run(const Any& stored);
 
   private:
@@ -34,9 +34,9 @@ class BatchTaskRun {
     };
 
     int restoreAndRun(const Any& stored);
-    int refuse(int code, const char* text);
+    int failRestore(int code, const char* text);
     Segments reportSegments(const QvBatchTask& task);
-    int nothingOpen(const Segments& segments);
+    int failWithoutSegments(const Segments& segments);
     void transcode(QvBatchTask& task, const Segments& segments);
     int resultCode(const BatchTranscoder& transcoder, int result);
     void finish(int code, const char* message);

@@ -1,5 +1,5 @@
-// The transcoder of a batch: it reports progress and the change of segments, and carries out the wishes to
-// stop and to pause.
+// The transcoder of a batch: it reports progress and changes of the segment, and obeys requests to stop and
+// to pause.
 #pragma once
 
 #include "core/transcode/run/qvtranscoder.h"
@@ -10,15 +10,15 @@ class QvBatchTask;
 
 class BatchTranscoder : public QvTranscoder {
   public:
-    // The task, and what the control names as the current task and segment, are those that are reported.
+    // Reports carry the numbers of task and segment that `control` has.
     BatchTranscoder(QvBatchTask& task, BatchControl& control, BatchReport& report);
     ~BatchTranscoder() override { stop(); }
 
     int cbProgress(double part) override;
     int cbProcess() override;
 
-    // Whether the run came to a first round of work, or ended while it was opened.
-    bool worked() const { return worked_; }
+    // False if the run ended before its first round of work.
+    bool hasWorked() const { return worked_; }
 
   private:
     void followSegment();
@@ -26,6 +26,6 @@ class BatchTranscoder : public QvTranscoder {
     QvBatchTask& task_;
     BatchControl& control_;
     BatchReport& report_;
-    int openSegment_ = 0;  // among those that are open, as last read
+    int openSegment_ = 0;  // index among the open segments
     bool worked_ = false;
 };

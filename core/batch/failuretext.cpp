@@ -18,8 +18,8 @@ FailureText make(int code, const char* text) {
     return made;
 }
 
-// The words of an assertion without the place in the source, which is in the log; where it has no words, the
-// place is all there is.
+// The message of an assertion without its place in the source, which is in the log. Without a message, the
+// place.
 const char* wordsOf(const QvAssertFailure& failure) {
     const char* const words = std::strstr(failure.what(), ": \n");
     return words && words[3] ? words + 3 : failure.what();

@@ -1,4 +1,4 @@
-// What an exception says, for code that continues after one of any type.
+// The text of an exception of any type, for code that continues after it.
 #pragma once
 
 struct FailureText {
@@ -6,5 +6,5 @@ struct FailureText {
     char text[512];  // one line, never empty
 };
 
-// Of the exception that is being handled; takes no memory.
+// Of the exception that is being handled. Does not allocate.
 FailureText qvCurrentFailure() noexcept;

@@ -13,7 +13,7 @@ namespace {
 
 constexpr const char* listKey = "taskList";
 
-// A task is a bag of many values: what is asked or changed often works without a copy of it.
+// Tasks are large dictionaries: frequent queries and changes work without a copy.
 const AnyDict& taskAt(const QvBatchList& list, int index) {
     QV_ASSERT_MSG(index >= 0 && index < list.size(), "Invalid list index");
     const Any& task = static_cast<const AnyVector&>(list).at(index);
@@ -42,7 +42,7 @@ class ChangedTask {
     AnyDict& dict_;
 };
 
-// The list as the dictionary of a document, and back again at the end.
+// The dictionary of a document that holds the list, which gets its tasks back at the end.
 class StoredList {
   public:
     explicit StoredList(AnyVector& list) : list_(list), inside_(dict.set(listKey, AnyVector()).asVector()) {
@@ -85,7 +85,7 @@ bool QvBatchList::moveTask(int index, int delta) {
     return true;
 }
 
-// --- Output files. A name is the same in both widths.
+// --- Output files. Narrow and wide names compare equal.
 
 bool QvBatchList::hasOutputFile(const Any& name, int except) const {
     if (!name.isText()) return false;

@@ -112,7 +112,7 @@ int QvBatchProcessor::run() {
     return result;
 }
 
-// Does not throw, so that a thread that waits for the end of the run learns of it.
+// Does not throw: control.end() has to follow in any case.
 int QvBatchProcessor::Private::runBatch() {
     BatchReport report(control, error, callback);
     BatchContext batch{control, error, report, options, smartRender};
@@ -126,12 +126,12 @@ int QvBatchProcessor::Private::runBatch() {
     }
     control.leave();
     report.tell([](QvBatchProcessCb& cb) { cb.batchFinished(); });
-    return report.broken() ? QvStatus::failed : result;
+    return report.failed() ? QvStatus::failed : result;
 }
 
 void QvBatchProcessor::Private::runTasks(BatchContext& batch) {
     for (int i = 0; i < static_cast<int>(tasks.size()); ++i) {
-        // A pause uses up the turn: the task that was due is left out.
+        // After a pause between two tasks the next one is skipped.
         if (control.waitWhilePaused([&](bool paused) {
                 batch.report.tell([&](QvBatchProcessCb& cb) { cb.batchPaused(paused); });
             }))

@@ -17,8 +17,8 @@ constexpr int settleTime = 2000;  // milliseconds
 
 std::string shown(const Any& name) { return qv_os_name(name); }
 
-// Of a file in a folder. Names from elsewhere may hold the separators of other systems, which are letters
-// here, and what looks like a drive or a host.
+// The name without the folder. Only '/' separates: separators and drive letters of other systems are a part
+// of the name.
 Any nameOf(const Any& path) {
     const std::string all = qv_os_name(path);
     return qv_any_name(all.substr(all.rfind('/') + 1), path);
@@ -36,7 +36,7 @@ std::string keyOf(const Any& name) {
     return QvUtil::md5Digest(name, maxChars).asString("");
 }
 
-// Pipes and devices are no files to wait for, and opening one can block.
+// Pipes and devices are never complete, and opening one can block.
 bool isRegular(const Any& path) {
     QvFileStatus status;
     return qv_platform().status(qv_os_name(path).c_str(), status) && status.isRegular;
@@ -150,8 +150,8 @@ int QvWatchFolderInput::fileProcessed() {
     }
     const Any name = queue_.front();
     queue_.remove(0);
-    // By the name, while the keys are digests: the entry stays, and so a file that comes back under its name
-    // is not taken again.
+    // The keys are digests, so this call by the name removes nothing: a file that comes back under the same
+    // name is not taken again.
     queued_.remove(shown(name).c_str());
     if (const int result = _postprocess(inFolder(folder_, name)); result != QvStatus::ok) return result;
     return _scan();

@@ -17,7 +17,7 @@
 
 namespace {
 
-// A decoder that is closed at its end.
+// Closes and destroys a decoder.
 struct CloseDecoder {
     void operator()(QvDecodePipe* decoder) const {
         const std::unique_ptr<QvDecodePipe> owned(decoder);
@@ -38,7 +38,7 @@ OpenDecoder openInput(const Any& file) {
     }
 }
 
-// So that the next target starts at the beginning.
+// The next target starts at the beginning again.
 void rewind(QvDecodePipe& decoder) {
     for (int k = 0; k < decoder.nrVideoStreams(); ++k)
         if (decoder.isSelected(qvVideoStream, k)) decoder.seekToFrame(0, k);
@@ -46,19 +46,19 @@ void rewind(QvDecodePipe& decoder) {
         if (decoder.isSelected(qvAudioStream, k)) decoder.seekToSample(0, k);
 }
 
-// Why an output would cost something that is needed, or null.
+// Why the output must not be written; null if it may.
 const char* unusable(const Any& output, const Any& input, const std::vector<std::string>& others) {
     if (QvFile::isSameFile(output, input)) return "is the input";
     if (std::find(others.begin(), others.end(), qv_os_name(output)) != others.end())
         return "is the output of another target";
-    // It would be found there as a new input, and so would what is made of that.
+    // There it would be found as a new input, and its own outputs again.
     if (QvFile::isSameFile(QvFile::getPath(output), QvFile::getPath(input)))
         return "would be in the watched folder";
     return nullptr;
 }
 
-// An input's name without its folder. A backslash, a letter here, would make it the name of what follows, and
-// its output that of another file.
+// An input's name without its folder. A backslash is replaced: the operations on file names take it for a
+// separator, so that the output would get the name of another file.
 Any nameToMake(const Any& file) {
     const std::string path = qv_os_name(file);
     std::string name = path.substr(path.rfind('/') + 1);
@@ -97,7 +97,7 @@ int QvWatchProcessor::nameOutput(QvEncodePipe& pipe, const QvWatchTask& task, in
     return pipe.setFilename(task.outputFilename(target, nameToMake(inputFile), extension.asString("")));
 }
 
-// What is thrown fails one target alone; the next one still starts at the beginning.
+// An exception fails this target only; the next one still starts at the beginning.
 int QvWatchProcessor::_tryTarget(QvDecodePipe& decoder, const QvWatchTask& task, int target,
                                  const Any& inputFile, std::vector<std::string>& outputs) {
     try {
@@ -107,7 +107,7 @@ int QvWatchProcessor::_tryTarget(QvDecodePipe& decoder, const QvWatchTask& task,
         qv_log()->error("    Transcoding error: %s", failure.text);
         try {
             if (target + 1 < task.nrTargets()) rewind(decoder);
-        } catch (...) {  // the next target meets it again
+        } catch (...) {  // the next target reports it
         }
         return failure.code;
     }

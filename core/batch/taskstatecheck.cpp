@@ -20,7 +20,7 @@ std::string step(const std::string& path, const std::string& next) {
 
 std::string step(const std::string& path, int index) { return step(path, std::to_string(index + 1)); }
 
-// A vector of dictionaries under a key.
+// The vector of dictionaries under a key.
 const AnyVector& list(const AnyDict& parent, const char* key, const std::string& path) {
     const Any& found = parent.get(key);
     if (!found.isVector() || found.asVector().empty()) damaged(path, "it is missing or empty");
@@ -36,14 +36,14 @@ int streamType(const AnyDict& stream, const std::string& path) {
     return type;
 }
 
-// Times, in and out in turn.
+// In and out points alternate.
 void checkPoints(const AnyDict& source, const std::string& path) {
     const Any& points = source.getDict("process").get("inOutPoints");
     if (!points.isValid()) return;
-    bool sound = points.isVector() && points.asVector().size() % 2 == 0;
-    if (sound)
-        for (const Any& point : points.asVector()) sound = sound && point.isMediaTime();
-    if (!sound) damaged(step(path, "process/inOutPoints"), "it holds no pairs of times");
+    bool valid = points.isVector() && points.asVector().size() % 2 == 0;
+    if (valid)
+        for (const Any& point : points.asVector()) valid = valid && point.isMediaTime();
+    if (!valid) damaged(step(path, "process/inOutPoints"), "it holds no pairs of times");
 }
 
 void checkSource(const Any& source, int type, const std::string& path) {
@@ -58,7 +58,7 @@ void checkSource(const Any& source, int type, const std::string& path) {
     checkPoints(dict, path);
 }
 
-// All streams that have sources have as many segments.
+// All streams with sources have the same number of segments.
 void checkStreams(const AnyVector& streams, const AnyVector& outputs) {
     if (streams.size() != outputs.size()) damaged("streams", "they are not as many as those of the encoder");
     int segments = 0;

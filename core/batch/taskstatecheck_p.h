@@ -1,10 +1,11 @@
-// What a stored task must hold before it is restored, which asserts what no stored task can hold.
+// Checks a stored task before it is restored: to the restoring code damage is a programming error, which
+// asserts.
 #pragma once
 
 #include <string>
 
 class Any;
 
-// Empty for a sound task, else what is wrong at which place: "streams/2/type: it is no type of stream".
-// Numbers count from 1. Modules are not looked for and files not opened: to restore the task says that.
+// Empty for a valid task, otherwise what is wrong and where: "streams/2/type: it is no type of stream".
+// Numbers count from 1. Missing modules and files are not looked for here: restoring the task reports them.
 std::string qvTaskStateFault(const Any& stored);

@@ -30,9 +30,8 @@ class ChildTask {
     double speed() const { return progress_.speed(); }  // negative if unknown
     // Those since the last call.
     std::vector<std::string> takeWarnings() { return progress_.takeWarnings(); }
-    const std::string& failure() const {
-        return progress_.failure();
-    }  // why it failed; "" if it has not, or gave no reason
+    // Why it failed; "" if it has not, or gave no reason.
+    const std::string& failure() const { return progress_.failure(); }
     const std::vector<std::string>& outputs() const { return progress_.outputs(); }
 
   private:

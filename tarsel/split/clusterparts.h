@@ -40,7 +40,7 @@ class ClusterParts : public PartExecutor {
     void readProgress(size_t part);
     void end(size_t part, int status);
     void queryScheduler();
-    void showPending(const std::vector<ClusterElement>& living);
+    void showPending(const std::vector<ClusterElement>& active);
     void cancelJob();
     bool finished() const;
 

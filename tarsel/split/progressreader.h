@@ -18,9 +18,8 @@ class ProgressReader {
     double speed() const { return speed_; }  // negative if unknown
     // Those since the last call.
     std::vector<std::string> takeWarnings() { return std::exchange(warnings_, {}); }
-    const std::string& failure() const {
-        return failure_;
-    }  // why it failed; "" if it has not, or gave no reason
+    // Why it failed; "" if it has not, or gave no reason.
+    const std::string& failure() const { return failure_; }
     const std::vector<std::string>& outputs() const { return outputs_; }
 
   private:

@@ -79,11 +79,10 @@ void Split::plan(const JobPlan& plan) {
     if (!plan.hasVideo()) throw failure(Msg::splitNoPicture, {plan.output.name});
     split_ = planSplit(plan, wanted_);
     sound_ = plan.count(qvAudioStream) > 0;
-    const auto picture = std::ranges::find_if(plan.streams, &PlannedStream::isVideo);
-    rate_ = static_cast<double>(picture->picture.rate.rate());
+    const PlannedStream& picture = pictureOf(plan);
+    rate_ = static_cast<double>(picture.picture.rate.rate());
     notes_.clear();
-    if (isFilm(plan) && !isCodedAlone(*picture))
-        notes_.push_back(lineOf(Msg::splitApart, {plan.output.name}));
+    if (isFilm(plan) && !isCodedAlone(picture)) notes_.push_back(lineOf(Msg::splitApart, {plan.output.name}));
 }
 
 std::string Split::text() const {

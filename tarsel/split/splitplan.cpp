@@ -97,9 +97,7 @@ bool isCodedAlone(const PlannedStream& picture) {
     return picture.encoder() == std::string_view("rawvenc") || is("onlyKeys") || is("uncompressed");
 }
 
-const PlannedStream& pictureOf(const JobPlan& plan) {
-    return *std::ranges::find_if(plan.streams, &PlannedStream::isVideo);
-}
+const PlannedStream& pictureOf(const JobPlan& plan) { return *plan.firstVideo(); }
 
 long long splitUnit(const JobPlan& plan) {
     const PlannedStream& picture = pictureOf(plan);

@@ -58,7 +58,7 @@ int ADecStream::prepare(int targetRate, const FiltersState* filters, std::string
 
 long long ADecStream::targetSamples() const { return qvmath::mulDiv(samples_, targetRate_, 1, sourceRate_); }
 
-// Appends samples that filters or a decoder gave. A filter may have changed their form.
+// Appends samples of the filters or of the decoder. Fails if a filter has changed their format.
 int ADecStream::append(const QvPcm& from, int count) {
     if (count == 0) return QvStatus::ok;
     if (from.samples() < count || from.channels() != channels_ || from.bytesPerSample() != mixBytes ||
@@ -106,7 +106,7 @@ int ADecStream::seek(long long sample) {
     pcm_.setSamples(0);
     pcm_.setPosition(own - 1);
     status_ = result == QvStatus::ok || result == QvStatus::endOfStream ? result : QvStatus::failed;
-    // What the filters hold belongs to the former place.
+    // The filters still hold samples from before the seek.
     if (pipe_ && (pipe_->close() != QvStatus::ok || pipe_->open() != QvStatus::ok))
         status_ = QvStatus::failed;
     return status_;

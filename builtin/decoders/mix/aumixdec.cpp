@@ -72,7 +72,7 @@ void AudioMixDec::getParam(const char* name, Any& value) const {
     }
 }
 
-// The set-up of the file becomes the state.
+// Reads the set-up from the file into source_.state.
 int AudioMixDec::loadSetup() {
     inputFailure_ = QvMetafile::check(source_.filename);
     QvAudioMixDecSetup setup;
@@ -81,7 +81,7 @@ int AudioMixDec::loadSetup() {
         result = setup.load(source_.filename);
         if (result != QvStatus::ok) inputFailure_ = "it holds no mix of sounds";
     } else {
-        // Loading it might end in an assertion.
+        // A damaged file is not loaded, as that may assert.
         qv_log()->error("[audiomixdec]Failed to open %s, %s", shown(source_.filename).c_str(),
                         inputFailure_.c_str());
     }

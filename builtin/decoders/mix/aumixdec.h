@@ -1,8 +1,8 @@
 // Decoder "aumixdec": several files as one sound, each output channel a weighted sum of channels of them.
 //
 // Reads metafiles ("mmf") with an "AudioInterleave" element, or a set-up from memory; see QvAudioMixDecSetup.
-// There is one stream, of 32 bits in the range of 24, as long as the longest input; the others are silent
-// after their ends.
+// There is one stream, of 32 bits in the range of 24, as long as the longest input. Shorter inputs
+// are silent after their ends.
 //
 // Parameters: "filename" (text) or "metaState" (Dict, what QvAudioMixDecSetup::store makes; with a file, what
 // it held): the last of the two that was set counts. "targetSamplerate" (Hz, 0 at first: the highest of all

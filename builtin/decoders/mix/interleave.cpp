@@ -57,7 +57,7 @@ int Interleave::prepare(int targetRate, const AnyDict& inputParams) {
     if (const int result = selectStreams(rate); result != QvStatus::ok)
         return fail(result, "[mixadec]Failed to select input streams(s)");
     int result = setUpMix();
-    if (result == QvStatus::ok) result = publish(rate);
+    if (result == QvStatus::ok) result = publishParams(rate);
     return result == QvStatus::ok ? result : fail(result, "[mixadec]Failed to setup mixing");
 }
 
@@ -108,7 +108,7 @@ int Interleave::chooseRate(int targetRate) const {
 int Interleave::selectStreams(int rate) {
     for (std::size_t i = 0; i < decoders_.size(); ++i) {
         QvDecodePipe* const decoder = decoders_[i].get();
-        // As the set-up names it: a decoder may have found another file by it.
+        // The name in the set-up: the decoder may have resolved it to another one.
         const Any file = setup.inFileName(static_cast<int>(i));
         for (const Any& stream : setup.getFileActiveStreams(file)) {
             const int number = stream.asInt32();
@@ -160,24 +160,30 @@ int Interleave::setUpMix() {
         if (!outputs.at(out).isDict()) continue;
         for (const Any& entry : outputs.at(out).asDict().getVector("source")) {
             if (!entry.isDict()) continue;
-            const AnyDict& source = entry.asDict();
-            const int input = indexOf(source.get("src"), source.getInt32("stream"));
-            QV_ASSERT_MSG(input >= 0, "a source of the mix is no input");
-            const int channel = source.getInt32("channel");
-            const int count = inputs_[static_cast<std::size_t>(input)]->channels();
-            if (channel < 0 || channel >= count) {
-                inputFailure_ = "input '" + shown(source.get("src")) + "': there is no channel " +
-                                std::to_string(channel) + ", the last one is " + std::to_string(count - 1);
-                return QvStatus::failed;
-            }
-            const Any& weight = source.get("weight");
-            mix_.setWeight(out, input, channel, weight.isInt() || weight.isFloat() ? weight.toDouble() : 0.0);
+            if (const int result = setSource(out, entry.asDict()); result != QvStatus::ok) return result;
         }
     }
     return QvStatus::ok;
 }
 
-int Interleave::publish(int rate) {
+// Sets the weight that a channel of an input has in an output channel.
+int Interleave::setSource(int out, const AnyDict& source) {
+    const int input = indexOf(source.get("src"), source.getInt32("stream"));
+    QV_ASSERT_MSG(input >= 0, "a source of the mix is no input");
+    const int channel = source.getInt32("channel");
+    const int count = inputs_[static_cast<std::size_t>(input)]->channels();
+    if (channel < 0 || channel >= count) {
+        inputFailure_ = "input '" + shown(source.get("src")) + "': there is no channel " +
+                        std::to_string(channel) + ", the last one is " + std::to_string(count - 1);
+        return QvStatus::failed;
+    }
+    const Any& weight = source.get("weight");
+    mix_.setWeight(out, input, channel, weight.isInt() || weight.isFloat() ? weight.toDouble() : 0.0);
+    return QvStatus::ok;
+}
+
+// The parameters of the stream, and its buffer.
+int Interleave::publishParams(int rate) {
     long long bytes = 0;
     for (const auto& decoder : decoders_)
         if (const Any size = decoder->QvCodec::getParam("filesize"); size.isInt()) bytes += size.toInt64();

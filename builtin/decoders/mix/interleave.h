@@ -18,17 +18,16 @@ class Interleave : public DPipeAudioStream {
 
     QvAudioMixDecSetup setup;
 
-    // Opens the inputs. `targetRate`: Hz; 0 for the highest of all inputs.
-    // `inputParams`: with which they are opened; may be empty. 0, also when a file can't be
-    // opened: then there are no parameters, and nothing is read. Otherwise a status, of which error() is the
-    // text.
+    // Opens the inputs with `inputParams`, which may be empty. `targetRate`: Hz; 0 for the highest of all
+    // inputs. 0, also if a file can't be opened: then the stream has no parameters and read() fails.
+    // Otherwise a status, with a text in error().
     int prepare(int targetRate, const AnyDict& inputParams = {});
     const std::string& error() const { return error_; }
-    // Why the inputs are not as the set-up says, for users; empty if they are.
+    // For users: why an input or the mix is not possible; empty if there is no such reason.
     const std::string& inputFailure() const { return inputFailure_; }
 
-    // Number of samples that are then in `pcm`. The last read may give up to two more than the stream has.
-    // -4 after the end; -1 if no input can be read.
+    // Reads into `pcm` and returns the number of samples. The last read may give up to two more than the
+    // stream has. -4 after the end; -1 if no input can be read.
     int read(int count);
     int seek(long long sample);  // 0 or -4
 
@@ -48,7 +47,8 @@ class Interleave : public DPipeAudioStream {
     int chooseRate(int targetRate) const;
     int selectStreams(int rate);
     int setUpMix();
-    int publish(int rate);
+    int setSource(int out, const AnyDict& source);
+    int publishParams(int rate);
     int indexOf(const Any& file, int stream) const;
     int fail(int code, const char* text);
     int stop(int result);

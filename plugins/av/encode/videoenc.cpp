@@ -127,11 +127,10 @@ AVPixelFormat VideoEnc::layout() const {
     return AV_PIX_FMT_YUV420P;
 }
 
-std::string VideoEnc::prepare() {
+// What is wrong with them; "" if nothing is.
+std::string VideoEnc::checkSettings() const {
     const VideoSettings& s = settings_;
     const VideoCodec& codec = *s.codec;
-    const AVCodec* const library = codec.library();
-    if (!library) return std::string("The installed library has no encoder ") + codec.encoder;
     if (s.width < 1 || s.height < 1) return "No size of the picture is set";
     if (!s.hasRate) return "No frame rate is set";
     const int least = std::min(codec.minSide, 16);
@@ -146,11 +145,21 @@ std::string VideoEnc::prepare() {
     if (s.isInterlaced() && !s.supportsFields())
         return "The codec takes two fields a picture in 4:2:2 of 1920x1080 only";
     if (s.twoPass && !s.passRecord) return "There are no statistics of a first pass";
+    return "";
+}
+
+std::string VideoEnc::prepare() {
+    const VideoSettings& s = settings_;
+    const VideoCodec& codec = *s.codec;
+    const AVCodec* const library = codec.library();
+    if (!library) return std::string("The installed library has no encoder ") + codec.encoder;
+    if (std::string fault = checkSettings(); !fault.empty()) return fault;
     context_.reset(avcodec_alloc_context3(library));
     packet_.reset(av_packet_alloc());
     if (!context_ || !packet_) return "Out of memory";
     std::string problem = configure(layout());
     if (problem.empty()) problem = describeCodec();
+    configureGroups();
     if (problem.empty()) problem = configureRate();
     if (problem.empty()) problem = setOptions(*context_, s.profileOptions);
     if (problem.empty()) problem = setOptions(*context_, s.options);
@@ -247,7 +256,8 @@ std::string VideoEnc::describeCodec() {
     return "";
 }
 
-std::string VideoEnc::configureRate() {
+// Groups of pictures, and the timecode in their headers.
+void VideoEnc::configureGroups() {
     const VideoSettings& s = settings_;
     AVCodecContext& c = *context_;
     if (s.codec->has(VideoTrait::groups)) {
@@ -264,6 +274,11 @@ std::string VideoEnc::configureRate() {
         if (c.framerate.num != 30000) std::replace(timecode.begin(), timecode.end(), ';', ':');
         setOption(c, "gop_timecode", timecode);
     }
+}
+
+std::string VideoEnc::configureRate() {
+    const VideoSettings& s = settings_;
+    AVCodecContext& c = *context_;
     // The bit rate selects the DNxHD profile: here the one of the highest quality.
     if (s.isInterlaced() && is(*s.codec, "vc3venc")) c.bit_rate = s.rate.rate().ratio() > 26 ? 220e6 : 185e6;
     if (!s.codec->has(VideoTrait::rated)) return "";
@@ -274,6 +289,14 @@ std::string VideoEnc::configureRate() {
     const double target = s.bitrate > 0 ? s.bitrate : s.codec->defaultBitrate;
     if (!(target > 0)) return "Neither a quality nor a bit rate is set";
     c.bit_rate = static_cast<std::int64_t>(target);
+    limitRate(target);
+    return "";
+}
+
+// The highest and lowest bit rate, and the buffer in which they hold.
+void VideoEnc::limitRate(double target) {
+    const VideoSettings& s = settings_;
+    AVCodecContext& c = *context_;
     const bool constant = s.vbr == QvBitrate::cbr;
     const double most = constant ? target : s.maxBitrate > target ? s.maxBitrate : 0;
     const bool av1 = is(*s.codec, "av1venc");
@@ -292,7 +315,6 @@ std::string VideoEnc::configureRate() {
     const bool fills = is(*s.codec, "mpegvenc") || is(*s.codec, "mpeg4venc");
     if (!constant && fills && most > 0)
         c.rc_min_rate = static_cast<std::int64_t>(std::min(s.minBitrate, target));
-    return "";
 }
 
 std::string VideoEnc::configurePass() {

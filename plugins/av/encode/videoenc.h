@@ -47,15 +47,18 @@ class VideoEnc : public QvVideoEncoder {
     UnitWriter output_;
     PassFiles files_;
     std::string statistics_;          // of a first pass, or for a second one
-    std::vector<std::uint8_t> sets_;  // parameter sets
+    std::vector<std::uint8_t> sets_;  // parameter sets, written before each key frame
     long long frames_ = 0, units_ = 0;
 
     int fail(const std::string& why);
     bool carryCaptions(const QvFrame& frame, AVFrame& picture);
+    std::string checkSettings() const;
     std::string prepare();
     std::string refusal(int code) const;
     std::string configure(AVPixelFormat layout);
+    void configureGroups();
     std::string configureRate();
+    void limitRate(double target);
     std::string configurePass();
     std::string describeCodec();
     AVPixelFormat layout() const;

@@ -1,12 +1,13 @@
-// What the numbers of an encoded picture stand for, when a film said it of its own.
+// The colour description (primaries, transfer, matrix) that an output takes over from a film.
 #pragma once
 
 #include "tarsel/picture/picture.h"
 
-// High dynamic range or wide primaries: what is no usual television.
+// Whether the colours are high dynamic range or wide gamut, beyond standard television.
 bool isWide(const Colours& colours);
 
-// Of pictures that are encoded as `out`; nothing where the encoder is to go by the lines. `converted`: they
-// pass the engine's scaler, which knows BT.601 and BT.709: below 720 lines the one, from there on the other.
-// A film of another matrix keeps its numbers as long as the scaler goes from one to the same.
+// The description of pictures that are encoded as `out`; empty where the encoder's default for their height
+// is right. `converted`: they pass the engine's scaler, which knows BT.601 (below 720 lines) and BT.709 only.
+// If it converts from one to the other, the film's description no longer holds; otherwise it does, whatever
+// the film's matrix.
 Colours coloursOf(const PictureFormat& in, const PictureFormat& out, bool converted);

@@ -36,7 +36,7 @@ std::vector<Chapter> chaptersOf(const AnyDict& meta) {
     return chapters;
 }
 
-// One of the plans that follow each other.
+// One of the segments that follow each other.
 class Part {
   public:
     explicit Part(const JobPlan& plan)
@@ -49,7 +49,7 @@ class Part {
         return qvInstantOf(stream_.expected, rate);
     }
 
-    // In the part's own time. With `always` there is one at the start.
+    // Times count from the start of the part. With `always` there is a chapter at the start.
     std::vector<Chapter> chapters(bool always) const {
         std::vector<Chapter> taken;
         std::optional<Chapter> first;
@@ -124,7 +124,7 @@ bool isKey(const std::string& key) {
            std::all_of(key.begin(), key.end(), fits);
 }
 
-// "key=value"; an empty value takes the tag away.
+// "key=value"; an empty value removes the tag.
 void setTag(AnyDict& tags, const std::string& word) {
     const size_t equals = word.find('=');
     if (equals == std::string::npos) throw failure(Msg::keyNotPair, {"--meta", word});

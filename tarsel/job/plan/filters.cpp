@@ -9,9 +9,9 @@
 
 namespace {
 
-// The options with which a picture gets a format. One of another shape keeps its own, between bars.
-EffectOptions leadingTo(const PictureFormat& format, const PictureFormat& from,
-                        const EffectOptions& options) {
+// The options that give a picture this format. A picture of another aspect ratio keeps it and gets bars.
+EffectOptions optionsFor(const PictureFormat& format, const PictureFormat& from,
+                         const EffectOptions& options) {
     constexpr double alike = 0.01;
     EffectOptions other = options;
     const std::string size = std::to_string(format.width) + "x" + std::to_string(format.height);
@@ -32,8 +32,9 @@ FilterPlanner::FilterPlanner(JobPlan& plan, const EffectOptions& options,
     for (PlannedStream& stream : plan.streams) {
         if (!stream.isVideo()) continue;
         const auto number = static_cast<size_t>(stream.number);
-        if (number < known.size()) towards_.push_back(leadingTo(known[number], stream.picture, options));
-        pictures_.emplace_back(number < known.size() ? towards_.back() : options, stream.picture,
+        if (number < known.size())
+            knownOptions_.push_back(optionsFor(known[number], stream.picture, options));
+        pictures_.emplace_back(number < known.size() ? knownOptions_.back() : options, stream.picture,
                                plan.output.kind == OutputKind::pictures);
         stream.picture = pictures_.back().out();
     }

@@ -9,7 +9,7 @@
 struct JobPlan;
 struct PlannedStream;
 
-// What was asked for has to have something that it works on. Throws Failure.
+// Throws Failure for an option or filter without a stream that it works on.
 void checkEffects(const JobPlan& plan, const EffectOptions& options);
 
 class FilterPlanner {
@@ -26,6 +26,6 @@ class FilterPlanner {
     void planPicture(PlannedStream& stream);
 
     JobPlan& plan_;
-    std::list<EffectOptions> towards_;      // those that lead to known formats
-    std::vector<PictureEffects> pictures_;  // of the video streams, by their numbers
+    std::list<EffectOptions> knownOptions_;  // for streams of known formats; pictures_ refers to them
+    std::vector<PictureEffects> pictures_;   // of the video streams, by their numbers
 };

@@ -6,7 +6,7 @@ namespace {
 
 using Matcher = QvFormatMatcher;
 
-// Each by itself: an encoder need not have all of them.
+// Matched one by one, as an encoder may lack some of them.
 constexpr int kFormats[] = {Matcher::dimensions | Matcher::framerate, Matcher::frameAspect, Matcher::channels,
                             Matcher::samplerate, Matcher::bitsPerSample};
 constexpr int kAll[] = {Matcher::type,         Matcher::dimensions | Matcher::framerate,

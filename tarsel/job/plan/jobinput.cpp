@@ -45,9 +45,9 @@ JobInput readInput(const Source& source) {
         const auto ask = [&](const char* name) { return decoder.getAudioParam(i, name).asInt32(0); };
         InputStream stream;
         stream.type = qvAudioStream;
-        // Of a join these are with the silence that fills segments.
+        // In a join this count includes the silence that fills segments.
         stream.units = decoder.getAudioParam(i, "samples").asInt64(decoder.nrSamples(i));
-        // A mix has 32 bits, of which 24 are used.
+        // The sound of a mix has 32 bits; 24 of them are significant.
         stream.sound = {ask("samplerate"), ask("channels"), std::min(ask("bitsPerSample"), 24)};
         readWords(decoder, qvAudioStream, i, stream);
         input.audio.push_back(stream);

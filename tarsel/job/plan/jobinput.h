@@ -32,9 +32,9 @@ struct JobInput {
     std::string damage;    // see Source::damage
     double duration = -1;  // seconds of the longest stream; negative when unknown
     std::vector<InputStream> video, audio;
-    AnyDict meta;         // what it says of itself, see filmtags.h; empty for nothing
-    bool joined = false;  // its sound is those of other inputs, side by side, as --map takes them
-    bool joins = false;   // there
+    AnyDict meta;         // metadata, see filmtags.h
+    bool joined = false;  // its one sound consists of the channels of other inputs, for --map
+    bool joins = false;   // such an input has channels of this one
 
     const std::vector<InputStream>& streams(int type) const { return type == qvVideoStream ? video : audio; }
     // Of the first video stream.

@@ -26,7 +26,7 @@ SoundFormat soundFormat(const PlanOptions& options, const SoundFormat& in) {
 
 bool holdsSoundAlone(const OutputForm& output) { return output.kind == OutputKind::wav || output.soundOnly; }
 
-// What a preset has no stream for is left out, with a word.
+// Whether the preset has no stream of that type: the input's are left out then, with a warning.
 bool lacks(JobPlan& plan, const JobInput& input, int type) {
     if (!plan.preset || plan.preset->has(type)) return false;
     if (!input.streams(type).empty())
@@ -83,7 +83,7 @@ void checkKinds(JobPlan& plan, const PlanOptions& options) {
     throw failure(Msg::inputNoPicture, {output.name});
 }
 
-// A number that was asked for is refused by name where the encoder is set up.
+// A number that --channels gives is checked where the encoder is set up.
 void checkChannels(const JobPlan& plan, const PlanOptions& options) {
     constexpr int most = 32;  // of an output
     for (const PlannedStream& s : plan.streams)
@@ -92,7 +92,7 @@ void checkChannels(const JobPlan& plan, const PlanOptions& options) {
                           {plan.output.name, std::to_string(most), std::to_string(s.sound.channels)});
 }
 
-// What has a file of its own is one, or is numbered as the user says.
+// Where each stream has a file of its own there is one of a type, unless the output's name has numbers.
 void checkCounts(const JobPlan& plan) {
     const OutputForm& output = plan.output;
     if (!output.isFiles() || output.isOneFile()) return;
@@ -113,7 +113,7 @@ void checkFit(const JobPlan& plan, const PlanOptions& options) {
     checkChannels(plan, options);
 }
 
-// As captions, of which raw pictures hold none.
+// Warns of inputs of which nothing is used, such as captions for raw pictures.
 void warnOfUnused(JobPlan& plan, const PlanOptions& options) {
     const auto isLeft = [&](const JobInput& input, int type) {
         return unwanted(options, type) && !input.streams(type).empty();
@@ -160,6 +160,17 @@ int JobPlan::count(int type) const {
 }
 
 bool JobPlan::hasVideo() const { return count(qvVideoStream) > 0; }
+
+const PlannedStream* JobPlan::firstVideo() const {
+    const auto found = std::ranges::find_if(streams, &PlannedStream::isVideo);
+    return found != streams.end() ? &*found : nullptr;
+}
+
+const PlannedStream* JobPlan::lastVideo() const {
+    const auto found =
+        std::find_if(streams.rbegin(), streams.rend(), [](const auto& s) { return s.isVideo(); });
+    return found != streams.rend() ? &*found : nullptr;
+}
 
 const JobInput& JobPlan::input(const PlannedStream& stream) const {
     return inputs[static_cast<size_t>(stream.part.input)];
@@ -245,7 +256,7 @@ std::string planText(const JobPlan& plan) {
         text += "preset  " + inQuotes(plan.preset->name()) + ", " + plan.preset->reason() + "\n";
     const bool nowhere = plan.output.place == OutputPlace::nowhere;
     text += "output  " + (nowhere ? "nothing" : inQuotes(plan.output.name)) + " by " + plan.output.muxer();
-    // How long an encoder's results will be is not known.
+    // The size of compressed streams is not known.
     if (std::ranges::all_of(plan.streams, &PlannedStream::isRaw)) text += ", " + formatBytes(plan.bytes());
     return text + "\n";
 }

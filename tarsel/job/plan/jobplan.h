@@ -45,7 +45,7 @@ struct PlannedStream {
 
     bool isVideo() const { return type == qvVideoStream; }
     std::string encoder() const { return module.empty() ? isVideo() ? "rawvenc" : "rawaenc" : module; }
-    // The count of bytes is known beforehand.
+    // Whether it is written uncompressed, so that its size is known beforehand.
     bool isRaw() const { return encoder() == (isVideo() ? "rawvenc" : "rawaenc"); }
     const char* unit() const { return isVideo() ? "frames" : "samples"; }
     long long bytes(long long units) const;  // without headers; 0 for what an encoder compresses
@@ -58,15 +58,18 @@ struct JobPlan {
     std::vector<JobInput> inputs;
     std::vector<PlannedStream> streams;
     FilterFiles filterFiles;
-    // What the output says of itself, see filmtags.h; not set for what the multiplexer has already.
+    // Metadata of the output, see filmtags.h; not set if the multiplexer already has it.
     std::optional<AnyDict> tags;
     std::vector<std::string> warnings;
     std::vector<std::string> notes;  // lines for the user that are no warnings
 
     int count(int type) const;  // of streams
     bool hasVideo() const;
+    // Video streams of the output; null if there are none.
+    const PlannedStream* firstVideo() const;
+    const PlannedStream* lastVideo() const;
     const JobInput& input(const PlannedStream& stream) const;
-    // The one that `stream` is a part of.
+    // The stream of the input that `stream` is a part of.
     const InputStream& source(const PlannedStream& stream) const;
     long long bytes() const;  // that are written, without headers
 };
@@ -77,9 +80,10 @@ struct KnownFormats {
     std::vector<SoundFormat> sounds;
 };
 
-// Throws Failure for what can't be done. The engine has to be started, for its filters. With `known` it plans
-// one of several segments: its streams get these formats, those beyond them their own. A segment may lack
-// picture or sound, so checkOutput is then called for all together.
+// Throws Failure for what can't be done. The engine has to be started, for its filters. `known`: for one of
+// several segments, the formats that the streams of the earlier ones have; its streams get them too, and
+// further streams keep their own. As a segment may lack picture or sound, the caller then calls checkOutput
+// for all segments together.
 JobPlan planJob(const PlanOptions& options, const OutputForm& output, std::vector<JobInput> inputs,
                 const KnownFormats* known = nullptr);
 // Whether the output can hold the streams of the plan; sets its kind where they decide it. Throws Failure.

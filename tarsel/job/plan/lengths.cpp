@@ -1,6 +1,5 @@
 #include "tarsel/job/plan/lengths.h"
 
-#include <algorithm>
 #include <cmath>
 
 #include "tarsel/job/plan/jobplan.h"
@@ -20,7 +19,8 @@ void setFrames(const JobPlan& plan, PlannedStream& stream) {
     stream.expected = range.out;
 }
 
-// As the audio link does: sound that comes earlier starts later in its input.
+// As the engine's audio link counts them. Sound that is to come earlier is read from a later point of its
+// input.
 long long ownSamples(const JobPlan& plan, const PlannedStream& stream) {
     const InputStream& source = plan.source(stream);
     const auto moved = [&](const MediaTime& point) {
@@ -61,7 +61,7 @@ void endWith(const JobPlan& plan, const PlannedStream& sound, PlannedStream& vid
     part.whole = false;
 }
 
-// Up to the end of the frame in which the sound ends.
+// Repeats the last picture up to the end of the frame in which the sound ends.
 void holdFor(const JobPlan& plan, const PlannedStream& sound, PlannedStream& video) {
     const QvFramerate& rate = plan.source(video).picture.rate;
     StreamPart& part = video.part;
@@ -74,7 +74,8 @@ void holdFor(const JobPlan& plan, const PlannedStream& sound, PlannedStream& vid
     video.hold = true;
 }
 
-// Both of one input, and those to which the user gave points, end as near to each other as frames allow.
+// Notes that the sound is cut or filled up at the end of the picture. If both are of one input, or the user
+// gave points, less than a frame is not worth a note.
 void noteEnd(JobPlan& plan, const PlannedStream& stream, const PlannedStream& picture) {
     const double rate = stream.sound.samplerate;
     const double own = static_cast<double>(stream.own) / rate,
@@ -105,12 +106,11 @@ void planFrames(JobPlan& plan) {
 }
 
 void planSamples(JobPlan& plan) {
-    const auto last = std::find_if(plan.streams.rbegin(), plan.streams.rend(),
-                                   [](const PlannedStream& s) { return s.isVideo(); });
+    const PlannedStream* const last = plan.lastVideo();
     for (PlannedStream& stream : plan.streams) {
         if (stream.isVideo()) continue;
         stream.expected = stream.own = ownSamples(plan, stream);
-        if (last == plan.streams.rend()) continue;
+        if (!last) continue;
         stream.expected = QvUtil::samplesForFrames(static_cast<int>(last->expected), last->picture.rate,
                                                    stream.sound.samplerate);
         noteEnd(plan, stream, *last);

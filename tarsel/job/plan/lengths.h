@@ -3,12 +3,12 @@
 
 struct JobPlan;
 
-// Ends the pictures with the shortest sound (--shortest), or holds the last one up to the end of the longest
-// (--longest), where that is earlier, or later, than their own end. The parts, the formats and the delays
-// have to be known. Throws Failure where there is nothing to end with, or nothing is left.
+// `shortest`: ends the pictures where the shortest sound ends, if that is earlier. `longest`: repeats the
+// last picture up to the end of the longest sound, if that is later. Parts, formats and delays have to be
+// known. Throws Failure without a sound or a picture, and if no picture is left.
 void planEnds(JobPlan& plan, bool shortest, bool longest);
-// Sets the expected frames. The parts and the formats have to be known. Throws Failure for points that no
-// frame lies between.
+// Sets the expected frames. The parts and the formats have to be known. Throws Failure for points with no
+// frame between them.
 void planFrames(JobPlan& plan);
 // Sets the expected samples: next to a picture those that belong to its frames, otherwise those of the part.
 // Notes where a sound and its picture end apart. The expected frames and the delays have to be known.

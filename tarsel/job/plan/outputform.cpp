@@ -24,14 +24,14 @@ constexpr KindRow kKinds[] = {
     {"avi", OutputKind::avi},
 };
 
-// What the tool itself writes under an extension.
+// What the tool writes without a preset for an extension.
 std::optional<OutputKind> ownKind(const std::string& extension) {
     for (const KindRow& row : kKinds)
         if (extension == row.extension) return row.kind;
     return rawName(extension) ? std::optional(OutputKind::raw) : std::nullopt;
 }
 
-// A name that means something is not for another format.
+// The kind that the preset makes. A file name that means another format is refused.
 OutputKind kindOf(const PlanOptions& options, const OutputPreset& preset, OutputPlace place) {
     const auto named = ownKind(formatName(options));
     const bool avi = named == OutputKind::avi;

@@ -26,12 +26,12 @@ struct OutputForm {
     std::string muxerModule;                 // of OutputKind::module
     bool soundOnly = false;                  // of OutputKind::module: files of this name have no picture
 
-    // One file, whatever streams there are.
+    // All streams are in one file.
     bool isOneFile() const {
         return kind == OutputKind::avi || (kind == OutputKind::module && muxerModule != "rawmux");
     }
     bool isFiles() const { return place == OutputPlace::files; }
-    // A pipe, a device: what has gone there stays.
+    // A pipe or a device: what was written can't be changed any more.
     bool isStream() const { return place == OutputPlace::stream; }
     bool takesOneStream() const { return isStream() && !isOneFile(); }
     bool writesNothing() const { return kind == OutputKind::nothing || place == OutputPlace::nullDevice; }
@@ -44,6 +44,6 @@ struct OutputForm {
 std::string formatName(const PlanOptions& options);
 bool writesItself(const std::string& extension);
 
-// The form of an output that is `place`. Throws Failure for a name or a format that means nothing, or that
-// does not fit the place.
+// The form of an output in `place`. Throws Failure for an unknown name or format, and for one that does not
+// fit the place.
 OutputForm outputForm(const PlanOptions& options, OutputPlace place);

@@ -23,11 +23,11 @@ enum class OutputKind {
     byInput,  // a stream whose name does not say it: raw pictures, or WAV where there is no picture
 };
 
-// What the output says of itself.
+// Metadata of the output.
 struct TagOptions {
-    std::vector<std::string> given;  // "key=value", in place of what the inputs say
-    std::string languages;           // of the sounds, in their order: "eng,fra"
-    bool none = false;               // nothing of the inputs
+    std::vector<std::string> given;  // "key=value", in place of the inputs' tags
+    std::string languages;           // of the sounds, in order: "eng,fra"
+    bool none = false;               // no tags of the inputs
 };
 
 struct PlanOptions {

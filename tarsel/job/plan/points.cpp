@@ -1,7 +1,5 @@
 #include "tarsel/job/plan/points.h"
 
-#include <algorithm>
-
 #include "tarsel/job/plan/jobplan.h"
 #include "tarsel/words/messages.h"
 #include "tarsel/words/timespec.h"
@@ -31,12 +29,11 @@ class Points {
 
   private:
     static const PlannedStream& leadingOf(const JobPlan& plan) {
-        const auto picture =
-            std::find_if(plan.streams.begin(), plan.streams.end(), [](const auto& s) { return s.isVideo(); });
-        return picture != plan.streams.end() ? *picture : plan.streams.front();
+        const PlannedStream* const picture = plan.firstVideo();
+        return picture ? *picture : plan.streams.front();
     }
 
-    // Where the sound has a file of its own, "frames" are those of the picture.
+    // For an input without a picture, times in frames count those of the output's picture.
     std::optional<QvFramerate> rateFor(const JobInput& input) const {
         const auto own = input.frameRate();
         return own || !leading_.isVideo() ? own : plan_.input(leading_).frameRate();
@@ -48,7 +45,7 @@ class Points {
         if (!options_.duration.empty()) part.out = parseSpan(options_.duration, rate, "--duration", part.in);
     }
 
-    // `follows`: a sound that has ended before is silence next to its picture.
+    // `follows`: a sound next to a picture; if it has ended before the part, it is silent.
     void check(const StreamPart& part, const JobInput& input, const MediaTime& length, bool follows) const {
         if (part.out <= part.in && !options_.to.empty())
             throw failure(Msg::toNotAfter, {to(), options_.to, start()});

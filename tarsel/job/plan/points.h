@@ -11,7 +11,7 @@ struct PointOptions {
     std::string segment;  // the segment of a join that the times are of, for messages
 };
 
-// Sets the part of each stream of the plan. Times from the end count from that of the picture, so that all
-// streams keep together; what lies after the end of a stream is a warning. Throws Failure for points that
-// leave nothing.
+// Sets the part of each stream of the plan. Times from the end are counted from the end of the picture for
+// all streams, so that they stay in sync. An end after that of a stream is a warning. Throws Failure for
+// points that leave nothing.
 void planPoints(JobPlan& plan, const PointOptions& options);

@@ -16,7 +16,7 @@ QvEncoder& encoderOf(const QvEncodePipe& pipe, const PlannedStream& stream) {
     return *pipe.encoder(stream.type, stream.number);
 }
 
-// The shape in which the encoder's picture is shown.
+// The display aspect ratio of the encoder's picture.
 double aspectOf(const QvCodec& encoder, const PictureFormat& format) {
     try {
         const Any aspect = encoder.getParam("frameAspect");
@@ -41,7 +41,7 @@ void setSound(QvEncoder& encoder, const SoundFormat& sound) {
     setChecked(encoder, "bitsPerSample", sound.bits, "--bits");
 }
 
-// The rate, or the first that a container holds if it does not hold that one.
+// The sample rate, or the first one of the container if it does not hold this one.
 int rateIn(const char* muxer, int samplerate) {
     const QvModule* const module = muxer ? qv_registry()->module(muxer) : nullptr;
     const Any rates = module ? module->getAttr("samplerates") : Any();
@@ -120,7 +120,7 @@ void PresetPlanner::takeSound(PlannedStream& stream, const QvCodec& encoder) con
     if (!options_.bits && asked.bits) sound.bits = *asked.bits;
 }
 
-// The encoder is told once, for the first segment of a join.
+// Sets the colour description of the first segment of a join; later ones can only be compared with it.
 void PresetPlanner::setColours(const PlannedStream& stream, QvCodec& encoder) const {
     const PictureFormat& in = plan_.source(stream).picture;
     const std::string& name = plan_.input(stream).name;

@@ -1,4 +1,4 @@
-// What a preset makes of the streams of a plan: their encoders, and the formats that the options leave open.
+// Applies a preset to the streams of a plan: their encoders, and the formats that the options leave open.
 #pragma once
 
 #include <memory>
@@ -15,10 +15,10 @@ class PresetPlanner {
     // The formats that the pictures are to have, by their numbers: those that are known, and those that the
     // preset asks for; none where it leaves them to the options.
     const std::vector<PictureFormat>& pictures() const { return pictures_; }
-    // Sets the formats of the sounds, once it is known which there are. Throws Failure.
+    // Sets the formats of the sounds; --map has to be applied. Throws Failure.
     void takeSounds();
-    // Gives the streams the settings of their encoders, when the formats are those of the output. Throws
-    // Failure for a format that the preset or an encoder does not take.
+    // Sets the encoders of all streams, whose formats have to be those of the output. Throws Failure for a
+    // format that the preset or an encoder does not support.
     void settle();
 
   private:

@@ -17,7 +17,7 @@ std::unique_ptr<QvCodec> audioFilter(const std::string& module) {
 
 std::string nameOf(const std::string& spec) { return spec.substr(0, spec.find(':')); }
 
-// How many channels a filter works on; of more it would leave others silent, which no one means.
+// How many channels a filter can work on. It would leave further ones silent.
 int mostChannels(const AnyDict& filter, int channels) {
     return audioFilter(filter.getString("name", ""))->getParam("_maxChannels").asInt32(channels);
 }
@@ -71,7 +71,7 @@ SoundPlanner::SoundPlanner(JobPlan& plan, const PlanOptions& options)
     if (!options.sound.map.empty()) takeMap();
 }
 
-// What was asked for has to have something that it works on.
+// Throws for options without a sound that they work on, and for those that exclude each other.
 void SoundPlanner::checkOptions() const {
     const int sounds = plan_.count(qvAudioStream);
     const std::string given = options_.sound.given();
@@ -88,7 +88,7 @@ void SoundPlanner::checkOptions() const {
         throw failure(Msg::optionsExclude, {"--delay", std::string("--filter ") + kDelay});
 }
 
-// The sounds of a map, which there are, and the channels that each has.
+// Throws if the map names a sound or a channel that is not there.
 void SoundPlanner::checkMap(const ChannelMap& map, const std::vector<const PlannedStream*>& sounds) const {
     for (const auto& row : map.rows)
         for (const auto& [sound, channel] : row) {
@@ -143,13 +143,11 @@ void SoundPlanner::planDelay(PlannedStream& stream) const {
         if (nameOf(spec) == kDelay) delays.append(Any(filterState(spec)));
     const std::string& given = options_.sound.delay;
     if (!given.empty()) {
-        const auto video = std::find_if(plan_.streams.begin(), plan_.streams.end(),
-                                        [](const auto& s) { return s.isVideo(); });
         std::optional<QvFramerate> rate;
-        if (video != plan_.streams.end()) rate = video->picture.rate;
+        if (const PlannedStream* const video = plan_.firstVideo()) rate = video->picture.rate;
         const AnyDict state = delayState(parseDelay(given, rate));
         delays.append(Any(state));
-        // What the user lets come later is not to lose its end. Nothing at all is not delayed either.
+        // A sound that comes later keeps its end, which needs a longer part. An empty part stays empty.
         const int ms = state.getInt32("delay", 0);
         if (ms > 0 && stream.part.in < stream.part.out) stream.delayed = MediaTime(ms / 1000.0);
     }
@@ -186,7 +184,7 @@ void SoundPlanner::addGiven(PlannedStream& stream) const {
     }
 }
 
-// The level that is asked for is that of the output, so it is the last one.
+// Normalizing comes last, as its level is that of the output.
 void SoundPlanner::addOptions(PlannedStream& stream) const {
     const auto add = [&](const char* option, const AnyDict& filter, const std::string& settings) {
         const int channels = stream.sound.channels, most = mostChannels(filter, channels);
@@ -221,14 +219,13 @@ void SoundPlanner::addOptions(PlannedStream& stream) const {
     }
 }
 
-// Next to a picture the sound follows its frames.
+// Next to a picture the fades of the sound have the length of those of the picture, in whole frames.
 SoundFade SoundPlanner::fadeOf(const PlannedStream& stream) const {
     const std::string& spec = options_.effects.fade;
     const size_t comma = std::min(spec.find(','), spec.size());
     const std::string in = spec.substr(0, comma), out = comma < spec.size() ? spec.substr(comma + 1) : in;
-    const auto picture =
-        std::find_if(plan_.streams.rbegin(), plan_.streams.rend(), [](const auto& s) { return s.isVideo(); });
-    if (picture == plan_.streams.rend()) {
+    const PlannedStream* const picture = plan_.lastVideo();
+    if (!picture) {
         const auto seconds = [](const std::string& text) {
             return parseTime(text, std::nullopt, "--fade").seconds();
         };
@@ -257,7 +254,7 @@ void SoundPlanner::planConversion(PlannedStream& stream) const {
     }
     if (stream.channelMap.empty() && in.channels != out.channels) checkMix(stream);
     if (in.channels != out.channels || !mapCopies_) audioFilter("chconvert");
-    // What is moved or copied has nothing to round.
+    // Delaying and copying samples needs no rounding.
     const bool moves = std::all_of(stream.chain.begin(), stream.chain.end(),
                                    [](const auto& line) { return line.starts_with(kDelay); });
     const bool mixes = stream.channelMap.empty() ? out.channels < in.channels : !mapCopies_;
@@ -269,7 +266,8 @@ void SoundPlanner::planConversion(PlannedStream& stream) const {
     }
 }
 
-// By default the inputs are dealt to the outputs in turn, and each output is the mean of its share.
+// Without a map the input channels go to the output channels in turn, and each output is the mean of its
+// inputs.
 void SoundPlanner::checkMix(const PlannedStream& stream) const {
     const int in = plan_.source(stream).sound.channels, out = stream.sound.channels;
     if ((in + out - 1) / out <= ChannelMap::most) return;

@@ -12,8 +12,8 @@ struct JobPlan;
 struct PlannedStream;
 struct SoundFormat;
 
-// The time at the start of the sound that stored audio filters let the link skip. Throws Failure for a chain
-// that can't be built.
+// The time at the start of the sound that the engine skips for these audio filters, such as a negative delay.
+// Throws Failure for a chain that can't be built.
 MediaTime skippedSound(const AnyVector& filters, const SoundFormat& in, const SoundFormat& out);
 
 // Throws Failure where a stored filter would leave channels of the sound unwritten.
@@ -21,7 +21,7 @@ void checkChannels(const AnyDict& filter, const SoundFormat& in, const SoundForm
 
 class SoundPlanner {
   public:
-    // Takes the channels of --map, with which the sounds of the job are one. Both have to outlive it. Throws
+    // Applies --map, which joins the sounds of the job into one. Plan and options have to outlive it. Throws
     // Failure for options that do not fit.
     SoundPlanner(JobPlan& plan, const PlanOptions& options);
     // Sets how much earlier or later each sound comes, which the lengths depend on.

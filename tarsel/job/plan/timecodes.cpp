@@ -20,7 +20,7 @@ std::string formatted(long long frame, const QvFramerate& from, const QvFramerat
     if (nominal(from) != nominal(to) || from.df() != to.df()) {
         const long long count = code.frames() * nominal(to) / nominal(from);
         code = QvTimecode(code.hours(), code.minutes(), code.seconds(), static_cast<int>(count));
-        // Numbers that the rate drops are those of the frame after them.
+        // A number that drop-frame leaves out becomes that of the next frame.
         code = QvTimecode(code.frameNr(to, false), to, false);
     }
     char text[QvTimecode::textSize];

@@ -6,8 +6,9 @@
 #include <functional>
 #include <string>
 
-// What `text`, a timecode of frames at the rate `from`, has become `frames` later, for pictures at the rate
-// `to`: the second stays, and the frame is the one that is shown then. The text has a ';' where it drops
-// numbers, which it does at 30000/1001 and 60000/1001 alone. `frames` gets the rate that counts them.
+// The timecode that is `frames` frames after `text`. `text` counts frames at the rate `from`; the result is
+// for pictures at the rate `to`: its second is the same, its frame is converted. A ';' means drop-frame,
+// which exists at 30000/1001 and 60000/1001 only. `frames` is called with `from`, marked as drop-frame if the
+// text is.
 std::string movedTimecode(const std::string& text, const QvFramerate& from, const QvFramerate& to,
                           const std::function<long long(const QvFramerate& from)>& frames);
