@@ -96,6 +96,7 @@ Json describeStream(const QvDecodePipe& decoder, int type, int number) {
         stream["bit_rate"] = static_cast<long long>(p.get("vBitrate").asDouble());
     if (p.get("aBitrate").isInt()) stream["bit_rate"] = p.get("aBitrate").toInt64() * 1000;
     if (p.get("duration").isDouble()) stream["duration_s"] = p.get("duration").asDouble();
+    if (p.isSet("estimated")) stream["estimated"] = true;
     return stream;
 }
 
@@ -174,6 +175,7 @@ std::string oneLine(const Json& value) {
 
 std::string streamLine(const Json& s) {
     const auto number = [&](const char* key) { return std::to_string(s[key].get<long long>()); };
+    const std::string about = s.contains("estimated") ? "about " : "";
     std::string line = s.value("codec", "");
     const auto add = [&](const std::string& part) { line += (line.empty() ? "" : ", ") + part; };
     if (s.contains("profile")) line += (line.empty() ? "" : " ") + oneLine(s["profile"]);
@@ -182,7 +184,7 @@ std::string streamLine(const Json& s) {
         if (s.contains("width") && s.contains("height")) add(number("width") + "x" + number("height"));
         if (s.contains("rate"))
             add(s["rate_text"].get<std::string>() + " fps, " + s["scan"].get<std::string>());
-        if (s.contains("frames")) add(number("frames") + " frames");
+        if (s.contains("frames")) add(about + number("frames") + " frames");
         if (s.contains("views") && s["views"] != 1) add(number("views") + " views");
     } else if (s["type"] == "subpicture") {
         if (s.contains("encoding")) add(s["encoding"].get<std::string>());
@@ -201,7 +203,7 @@ std::string streamLine(const Json& s) {
         if (s.contains("bits")) add(number("bits") + " bit");
         if (s.contains("source_format")) add("from " + s["source_format"].get<std::string>());
         if (s.contains("channel_mask")) add(speakersOf(s["channel_mask"].get<long long>()));
-        if (s.contains("samples")) add(number("samples") + " samples");
+        if (s.contains("samples")) add(about + number("samples") + " samples");
     }
     if (s.contains("bit_rate")) add(std::to_string(s["bit_rate"].get<long long>() / 1000) + " kbit/s");
     if (s.contains("rotation")) add("turned by " + number("rotation") + " degrees");

@@ -155,9 +155,10 @@ int AvDec::openFilm() {
     }
     const auto input = MediaInput::open(*bytes_, settings_.container, reason);
     if (!input) return refuse(reason);
-    const auto from = settings_.exact    ? PacketIndex::From::packets
-                      : settings_.survey ? PacketIndex::From::survey
-                                         : PacketIndex::From::table;
+    const bool intact = !extent_.broken && extent_.bytes <= fileSize_;
+    const auto from = settings_.exact              ? PacketIndex::From::packets
+                      : settings_.survey && intact ? PacketIndex::From::survey
+                                                   : PacketIndex::From::table;
     index_ = PacketIndex::build(*input, reason, from);
     if (!index_) return refuse(reason);
     addStreams(*input, reason);
@@ -187,21 +188,27 @@ void AvDec::addStreams(MediaInput& input, std::string& reason) {
                 leaveOut(i, why);
                 continue;
             }
-            if (!zero.known && !covers) zero = {true, reader->zero(), reader->zeroBase()};
+            const FrameReader& opened = *reader;
+            if (!zero.known && !covers) zero = {true, opened.zero(), opened.zeroBase()};
             if (settings_.upright && reader->format().turn.any())
                 qv_log()->warning("Stream %u of '%s' is not turned upright: its pixel format can't be turned",
                                   i, filename().toString().asString(""));
             auto* const added = addStream(std::make_unique<PictureStream>(std::move(reader), &stream));
             const PictureFormat& format = added->reader().format();
             if (const long long lost = covers ? 0 : length.lost(stream); lost > 0) added->setLost(lost);
-            if (!covers && length.isCut(stream))
-                added->setTruncated(length.announced(stream, format.rate.rate().ratio(), format.frames));
+            if (covers) continue;
+            const double start = static_cast<double>(opened.zero()) / static_cast<double>(opened.zeroBase());
+            const long long announced =
+                length.announced(stream, format.rate.rate().ratio(), format.frames, start);
+            if (length.isCut(stream)) added->setTruncated(announced);
+            if (index_->isPartial()) added->setEstimated(announced);
         }
     };
     if (!index_->damage().empty())
         qv_log()->warning("'%s' is damaged: %s", filename().toString().asString(""),
                           index_->damage().c_str());
     addPictures(false);
+    const double start = static_cast<double>(zero.time) / static_cast<double>(zero.base);
     for (unsigned i = 0; i < container.nb_streams; ++i) {
         const AVStream& stream = *container.streams[i];
         if (stream.codecpar->codec_type != AVMEDIA_TYPE_AUDIO) continue;
@@ -217,8 +224,9 @@ void AvDec::addStreams(MediaInput& input, std::string& reason) {
                               filename().toString().asString(""), lost.c_str());
         auto* const added = addStream(std::make_unique<SoundStream>(std::move(reader), stream));
         const SoundFormat& format = added->reader().format();
-        if (length.isCut(stream))
-            added->setTruncated(length.announced(stream, format.samplerate, format.samples));
+        const long long announced = length.announced(stream, format.samplerate, format.samples, start);
+        if (length.isCut(stream)) added->setTruncated(announced);
+        if (index_->isPartial()) added->setEstimated(announced);
     }
     if (streams().empty()) addPictures(true);
     for (unsigned i = 0; zero.known && i < container.nb_streams; ++i) {
@@ -227,7 +235,7 @@ void AvDec::addStreams(MediaInput& input, std::string& reason) {
         addStream(std::make_unique<SubtitleStream>(
             std::make_unique<SubtitleReader>(*bytes_, settings_.container, stream, index_, zero.time,
                                              zero.base),
-            stream));
+            stream, !index_->isPartial()));
     }
     facts_ = filmFacts(container, zero);
 }

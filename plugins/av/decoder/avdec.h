@@ -28,6 +28,8 @@
 //     "concealed"      Int64   pictures so far that were damaged or did not come
 //     "framesLost"     Int64   pictures that are missing between others, where bytes of the file are missing;
 //                              "truncated" is set, too
+//     "estimated"      Int32   1: of a survey: "frames" and "duration" are what the film's header states;
+//                              likewise "samples" of sound. Subtitles have no "count" then
 //     "codecProfile"   String  of the codec: "High", "Main 10"
 //     "language"       String  where the container has it; so "title"
 //     "codecParams"    Dict    "pid", where the container numbers its streams

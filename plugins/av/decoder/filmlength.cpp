@@ -42,8 +42,19 @@ double FilmLength::seconds(const AVStream& stream) const {
         return static_cast<double>(stream.nb_frames) * av_q2d(stream.time_base);
     if (stream.duration != AV_NOPTS_VALUE)
         return static_cast<double>(stream.duration) * av_q2d(stream.time_base);
+    if (const double tagged = taggedSeconds(stream); tagged > 0) return tagged;
     if (container_.duration != AV_NOPTS_VALUE) return static_cast<double>(container_.duration) / AV_TIME_BASE;
     return 0;
+}
+
+// Of Matroska the header has the length of the longest stream, and a tag that of each. 0 for unknown.
+double FilmLength::taggedSeconds(const AVStream& stream) const {
+    const AVDictionaryEntry* const tag =
+        is("matroska") ? av_dict_get(stream.metadata, "DURATION", nullptr, 0) : nullptr;
+    std::int64_t microseconds = 0;
+    if (!tag || av_parse_time(&microseconds, tag->value, 1) < 0 || microseconds > container_.duration)
+        return 0;
+    return static_cast<double>(microseconds) / AV_TIME_BASE;
 }
 
 // Seconds from the first packet to the end of the last one; from 0 where the first is later, because then
@@ -66,6 +77,7 @@ double FilmLength::present() const {
 }
 
 bool FilmLength::endsEarly() const {
+    if (index_.isPartial()) return false;
     const auto* const row =
         std::find_if(std::begin(stated), std::end(stated), [&](const Stated& one) { return is(one.format); });
     if (row == std::end(stated) || container_.duration == AV_NOPTS_VALUE) return false;
@@ -125,11 +137,17 @@ long long FilmLength::lost(const AVStream& stream) const {
 }
 
 bool FilmLength::isCut(const AVStream& stream) const {
-    return cut_ || missingPackets(stream) > 0 || endsWithinPicture(stream) || announcedSamples(stream) > 0;
+    // The header allows for a shorter stream, its own tag doesn't.
+    const bool endMissing = extent_.bytes > bytes_ && taggedSeconds(stream) > 0;
+    return cut_ || endMissing || missingPackets(stream) > 0 || endsWithinPicture(stream) ||
+           announcedSamples(stream) > 0;
 }
 
-long long FilmLength::announced(const AVStream& stream, double rate, long long present) const {
-    const double units = seconds(stream) * rate;
+long long FilmLength::announced(const AVStream& stream, double rate, long long present, double start) const {
+    double units = seconds(stream) * rate;
+    // Some writers of Matroska count the time before the first picture, others don't.
+    if (is("matroska") && start > 0 && units - start * rate >= static_cast<double>(present))
+        units -= start * rate;
     long long whole = units > 0 && units < 1e15 ? std::llround(units) : 0;
     whole = std::max(whole, announcedSamples(stream));
     const bool pictures = stream.codecpar->codec_type == AVMEDIA_TYPE_VIDEO;

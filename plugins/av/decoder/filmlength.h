@@ -23,7 +23,8 @@ class FilmLength {
     // Pictures that are missing between others, where the file says that bytes are missing.
     long long lost(const AVStream& stream) const;
     // Frames or samples of the whole stream, at `rate` a second, of which `present` are there; 0 for unknown.
-    long long announced(const AVStream& stream, double rate, long long present) const;
+    // The first one is at `start` seconds on the clock of the container.
+    long long announced(const AVStream& stream, double rate, long long present, double start) const;
 
   private:
     const AVFormatContext& container_;
@@ -34,6 +35,7 @@ class FilmLength {
 
     bool is(const char* format) const;
     double seconds(const AVStream& stream) const;
+    double taggedSeconds(const AVStream& stream) const;
     double present() const;
     bool endsEarly() const;
     long long missingPackets(const AVStream& stream) const;

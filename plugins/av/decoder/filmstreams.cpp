@@ -7,6 +7,7 @@
 #include "core/media/qvframe.h"
 #include "plugins/av/decoder/filmfacts.h"
 #include "plugins/av/source/avheaders.h"
+#include "plugins/av/source/limits.h"
 
 namespace av {
 
@@ -94,6 +95,13 @@ void PictureStream::setLost(long long pictures) {
     params.set("framesExpected", reader_->format().frames);
 }
 
+void PictureStream::setEstimated(long long frames) {
+    frames = std::clamp<long long>(frames, reader_->format().frames, limits::frames);
+    params.set("frames", static_cast<int>(frames));
+    params.set("duration", static_cast<double>(frames) / reader_->format().rate.rate().ratio());
+    params.set("estimated", 1);
+}
+
 SoundStream::SoundStream(std::unique_ptr<SampleReader> reader, const AVStream& stream)
     : reader_(std::move(reader)) {
     const SoundFormat& format = reader_->format();
@@ -152,16 +160,23 @@ void SoundStream::setTruncated(long long expected) {
     params.set("samplesExpected", Any(expected));
 }
 
-SubtitleStream::SubtitleStream(std::unique_ptr<SubtitleReader> reader, const AVStream& stream)
+void SoundStream::setEstimated(long long samples) {
+    samples = std::max(samples, reader_->format().samples);
+    params.set("samples", Any(samples));
+    params.set("duration", static_cast<double>(samples) / reader_->format().samplerate);
+    params.set("estimated", 1);
+}
+
+SubtitleStream::SubtitleStream(std::unique_ptr<SubtitleReader> reader, const AVStream& stream, bool counted)
     : DPipeStream(qvSubpicStream), reader_(std::move(reader)) {
     params.set("type", 1);
     params.set("format", static_cast<int>(QvSubtitles::SRT));
-    params.set("count", reader_->count());
+    if (counted) params.set("count", reader_->count());
     params.set("encoding", 0);
     params.set("codec", SubtitleReader::codecName(stream));
     params.set("textEncoding", "UTF-8");
     describeStream(stream, params);
-    if (reader_->count() == 0) return;
+    if (!counted || reader_->count() == 0) return;
     params.set("first", reader_->first());
     params.set("last", reader_->last());
     params.set("duration", reader_->last() - reader_->first());

@@ -30,6 +30,7 @@ class PictureStream : public DPipeVideoStream {
     // The file was cut, or is damaged. Nothing changes if it has what it announces all the same.
     void setTruncated(long long expected);
     void setLost(long long pictures);  // between others
+    void setEstimated(long long frames);
 
   private:
     std::unique_ptr<PictureSource> reader_;
@@ -45,6 +46,7 @@ class SoundStream : public DPipeAudioStream {
     bool seek(long long sample);
     SampleReader& reader() { return *reader_; }
     void setTruncated(long long expected);
+    void setEstimated(long long samples);
 
   private:
     std::unique_ptr<SampleReader> reader_;
@@ -53,7 +55,8 @@ class SoundStream : public DPipeAudioStream {
 
 class SubtitleStream : public DPipeStream {
   public:
-    SubtitleStream(std::unique_ptr<SubtitleReader> reader, const AVStream& stream);
+    // `counted`: the reader knows all of them.
+    SubtitleStream(std::unique_ptr<SubtitleReader> reader, const AVStream& stream, bool counted);
     SubtitleReader& reader() { return *reader_; }
 
   private:

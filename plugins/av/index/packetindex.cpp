@@ -37,6 +37,15 @@ IndexedPacket indexed(const AVPacket& packet) {
 // presentation differ from those of decoding.
 constexpr std::size_t enoughRead = 256;
 
+// Packets, or bytes, that show the rate of pictures where the film's header states its length.
+constexpr std::size_t enoughForRate = 4096;
+constexpr std::int64_t enoughBytes = 32 << 20;
+
+bool statesLength(const AVFormatContext& container) {
+    return av_match_name("matroska", container.iformat->name) > 0 && container.duration > 0 &&
+           container.duration_estimation_method == AVFMT_DURATION_FROM_STREAM;
+}
+
 IndexedPacket tabled(const AVIndexEntry& entry, std::int64_t time) {
     IndexedPacket row{time, entry.timestamp, entry.pos, 0, 0, 0, 0, static_cast<std::uint32_t>(entry.size)};
     if (entry.flags & AVINDEX_KEYFRAME) row.flags |= AV_PKT_FLAG_KEY;
@@ -119,6 +128,23 @@ bool PacketIndex::continueByTable(const AVFormatContext& container, std::vector<
     return true;
 }
 
+// Whether what was read of all streams says what they are, and none of them has to be decoded to be counted.
+bool PacketIndex::showsStreams(const AVFormatContext& container) const {
+    for (unsigned i = 0; i < container.nb_streams; ++i) {
+        const AVMediaType type = container.streams[i]->codecpar->codec_type;
+        const bool sound = type == AVMEDIA_TYPE_AUDIO;
+        if (!sound && type != AVMEDIA_TYPE_VIDEO) continue;
+        const bool cover = (container.streams[i]->disposition & AV_DISPOSITION_ATTACHED_PIC) != 0;
+        const auto counts = [sound](const IndexedPacket& packet) {
+            return packet.pts != AV_NOPTS_VALUE && (!sound || packet.samples != unknownSamples);
+        };
+        if (streams_[i].size() < (cover ? 1 : 2) ||
+            !std::all_of(streams_[i].begin(), streams_[i].end(), counts))
+            return false;
+    }
+    return true;
+}
+
 std::unique_ptr<PacketIndex> PacketIndex::build(MediaInput& input, std::string& reason, From from) {
     auto index = std::make_unique<PacketIndex>();
     const AVFormatContext& container = input.context();
@@ -131,7 +157,9 @@ std::unique_ptr<PacketIndex> PacketIndex::build(MediaInput& input, std::string& 
         return nullptr;
     }
     const bool tables = from != From::packets && input.leaveBytes();
+    const bool shortly = from == From::survey && statesLength(container);
     std::size_t count = 0;
+    std::int64_t bytes = 0;
     for (;;) {
         const MediaInput::Read result = input.read(*packet);
         if (result == MediaInput::Read::failed) index->damage_ = input.failure();
@@ -143,6 +171,7 @@ std::unique_ptr<PacketIndex> PacketIndex::build(MediaInput& input, std::string& 
             if (container.streams[stream]->codecpar->codec_type == AVMEDIA_TYPE_AUDIO)
                 index->streams_[stream].back().samples = samples[stream].next(*packet);
         }
+        bytes += packet->size;
         av_packet_unref(packet.get());
         if (++count > limits::packets) {
             reason = tooMany;
@@ -151,6 +180,11 @@ std::unique_ptr<PacketIndex> PacketIndex::build(MediaInput& input, std::string& 
         if (tables && from == From::survey && count == enoughRead &&
             index->continueByTable(container, samples, input.size()))
             break;
+        if (shortly && count % enoughRead == 0 && (count >= enoughForRate || bytes >= enoughBytes) &&
+            index->showsStreams(container)) {
+            index->partial_ = true;
+            break;
+        }
     }
     if (count == 0) {
         reason = index->damage_.empty() ? "it is empty" : index->damage_;

@@ -36,7 +36,8 @@ class PacketIndex {
         packets,  // all are read
         table,    // the same, without their bytes where the container's tables say all
         survey,  // the table itself where it has all packets: as many as there are, from the first time on to
-                 // the last, but which packet has which time is not known. For counting only.
+                 // the last, but which packet has which time is not known. For counting only. Of Matroska,
+                 // which has no such table, the first packets where its header states the film's length.
     };
     // Reads `input` from its start to its end, all streams, and rewinds it. What a damaged file has up to its
     // damage is kept: damage() says what happened. Null with `reason` when there is not even a packet, or
@@ -55,13 +56,16 @@ class PacketIndex {
     PacketKey keyOf(int stream, std::size_t packet) const;
 
     const std::string& damage() const { return damage_; }  // "" for none; else a part of a sentence
+    bool isPartial() const { return partial_; }            // of a survey: more packets follow
 
   private:
     bool continueByTable(const AVFormatContext& container, std::vector<PacketSamples>& samples,
                          long long bytes);
+    bool showsStreams(const AVFormatContext& container) const;
 
     std::vector<std::vector<IndexedPacket>> streams_;
     std::string damage_;
+    bool partial_ = false;
 };
 
 }  // namespace av

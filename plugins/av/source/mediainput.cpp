@@ -352,24 +352,28 @@ bool MediaInput::rewind() {
     state_->hasFound = false;
     av_packet_unref(state_->found.get());
     // The library's demultiplexer of WavPack keeps the header of a block after a seek.
-    if (std::exchange(lost_, false) || std::strcmp(context().iformat->name, "wv") == 0) {
-        const int streams = static_cast<int>(context().nb_streams);
-        if (!openState(failure_)) return false;
-        if (static_cast<int>(context().nb_streams) < streams) {
-            failure_ = "its streams have changed";
-            return false;
-        }
-        selectOnly(only_);
-        return true;
-    }
+    if (std::exchange(lost_, false) || std::strcmp(context().iformat->name, "wv") == 0) return reopen();
     AVFormatContext& all = context();
     if (isBare(all)) return av_seek_frame(&all, -1, 0, AVSEEK_FLAG_BYTE) >= 0;
     // The start of a film is not always a time of 0, and may be no key packet of any stream.
     if (avformat_seek_file(&all, -1, INT64_MIN, INT64_MIN, INT64_MAX, 0) >= 0) return true;
+    // Matroska with no block that is marked as key has nothing to seek by, and other ways lose blocks.
+    if (av_match_name("matroska", all.iformat->name) > 0) return reopen();
     if (avformat_seek_file(&all, -1, INT64_MIN, all.start_time, INT64_MAX, 0) >= 0) return true;
     if (av_seek_frame(&all, -1, 0, AVSEEK_FLAG_BYTE) >= 0) return true;
     failure_ = "it can't be read from its start again";
     return false;
+}
+
+bool MediaInput::reopen() {
+    const int streams = static_cast<int>(context().nb_streams);
+    if (!openState(failure_)) return false;
+    if (static_cast<int>(context().nb_streams) < streams) {
+        failure_ = "its streams have changed";
+        return false;
+    }
+    selectOnly(only_);
+    return true;
 }
 
 // Reads up to that packet. False if it does not follow.

@@ -79,8 +79,8 @@ class MediaInput {
     // index, but their times may differ from those of the index: in some containers they depend on where
     // reading started.
     bool seekTo(int stream, const PacketKey& packet, std::size_t number);
-    // Back to the first packet. After a failed read the file is opened again, and references into context()
-    // become invalid.
+    // Back to the first packet. After a failed read, and where the container has nothing to seek by, the file
+    // is opened again, and references into context() become invalid.
     bool rewind();
 
   private:
@@ -94,6 +94,7 @@ class MediaInput {
 
     MediaInput();
     bool openState(std::string& reason);
+    bool reopen();
     bool find(int stream, const PacketKey& packet);
     bool count(int stream, std::size_t number);
 };

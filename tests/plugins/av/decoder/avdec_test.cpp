@@ -55,6 +55,41 @@ TEST_F(FilmsInTheTool, areNotReadInASurvey) {
     }
 }
 
+// Matroska has no table of its pictures: of one that is whole the header's word counts, with "about".
+TEST_F(FilmsInTheTool, whoseHeaderStatesTheirLengthAreNotReadThroughToBeShown) {
+    folder.write("texts.srt",
+                 "1\n00:00:01,000 --> 00:00:02,000\nfirst\n\n2\n00:00:19,000 --> 00:00:20,000\nlast\n");
+    const std::string file =
+        film("long.mkv",
+             {"-i", folder.file("texts.srt"), "-map", "0", "-map", "1", "-c:v", "mpeg4", "-c:a", "pcm_s16le",
+              "-c:s", "srt"},
+             "testsrc2=size=32x32:rate=200:duration=21[out0];sine=sample_rate=8000:duration=20[out1]");
+    const std::string bytes = TempFolder::read(file);
+    folder.write("cut.mkv", bytes.substr(0, bytes.size() * 95 / 100));
+    const std::string late = TempFolder::read(film(
+        "late.mkv", {"-vf", "setpts=PTS+10/TB", "-fps_mode", "passthrough", "-c:v", "mpeg4", "-g", "5"}));
+    folder.write("latecut.mkv", late.substr(0, late.size() * 7 / 10));
+    const struct {
+        Words words;
+        int status;
+        std::vector<const char*> parts, others;
+    } cases[] = {
+        {{"long.mkv"}, 0, {"about 4200 frames", "about 160000 samples", "SubRip"}, {"subtitles"}},
+        {{"long.mkv", "--exact"}, 0, {", 4200 frames", ", 160000 samples", "2 subtitles"}, {"about"}},
+        {{"cut.mkv"}, 3, {"damaged", "of 4200 frames"}, {"about"}},
+        {{"latecut.mkv"}, 3, {"damaged", "of 50 frames"}, {}},
+    };
+    for (const auto& c : cases) {
+        Words words = {"info"};
+        words.insert(words.end(), c.words.begin(), c.words.end());
+        const Outcome shown = tarsel(words);
+        EXPECT_EQ(shown.status, c.status) << shown.err;
+        for (const char* part : c.parts) EXPECT_THAT(shown.out, HasSubstr(part));
+        for (const char* other : c.others) EXPECT_THAT(shown.out, Not(HasSubstr(other)));
+    }
+    EXPECT_THAT(tarsel({"info", "--json", "long.mkv"}).out, HasSubstr("\"estimated\": true"));
+}
+
 TEST_F(FilmsInTheTool, areTurnedUprightUnlessTheyAreWantedAsCoded) {
     const std::string plain = film("plain.mov", {"-c:v", "mpeg4", "-aspect", "3:1"});
     turnedFilm(plain, {0, 1, -1, 0});

@@ -1,5 +1,7 @@
 #include "plugins/av/source/mediainput.h"
 
+#include <utility>
+
 #include "plugins/av/index/packetindex.h"
 #include "plugins/av/source/avheaders.h"
 #include "tests/plugins/av/films.h"
@@ -37,9 +39,19 @@ TEST_F(MediaInputOfFilms, readersOfOneSourceDoNotDisturbEachOther) {
 }
 
 TEST_F(MediaInputOfFilms, aSeekFindsEveryPacketOfTheIndex) {
-    for (const char* name : {"film.mp4", "film.ts", "film.mkv", "film.avi", "film.mpg", "film.m2v"}) {
+    const Words mpeg = {"-c:v", "mpeg2video", "-g", "12", "-bf", "2"};
+    const std::pair<const char*, Words> films[] = {
+        {"film.mp4", mpeg},
+        {"film.ts", mpeg},
+        {"film.mkv", mpeg},
+        {"film.avi", mpeg},
+        {"film.mpg", mpeg},
+        {"film.m2v", mpeg},
+        {"keyless.mkv", {"-c:v", "vc2", "-pix_fmt", "yuv420p"}},  // no block is marked as key
+    };
+    for (const auto& [name, options] : films) {
         SCOPED_TRACE(name);
-        const av::MediaBytes bytes{Any(film(name, {"-c:v", "mpeg2video", "-g", "12", "-bf", "2"}).c_str())};
+        const av::MediaBytes bytes{Any(film(name, options).c_str())};
         std::string reason;
         const auto input = MediaInput::open(bytes, "", reason);
         ASSERT_TRUE(input) << reason;
