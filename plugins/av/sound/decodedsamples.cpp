@@ -276,13 +276,23 @@ bool DecodedSamples::describe(SoundFormat& format, std::string& reason) {
     return true;
 }
 
+// Samples to drop at the start as Matroska states them, which its times take into account: where pictures say
+// when the film starts, the times do.
+std::uint32_t DecodedSamples::statedPriming() {
+    const AVCodecParameters& codec = *stream().codecpar;
+    if (av_match_name("matroska", input_->context().iformat->name) <= 0 || codec.sample_rate < 1) return 0;
+    const std::int64_t samples = av_rescale(codec.initial_padding, samplerate_, codec.sample_rate);
+    return static_cast<std::uint32_t>(std::clamp<std::int64_t>(samples, 0, samplerate_));
+}
+
 bool DecodedSamples::place(bool hasZero, std::int64_t zero, std::int64_t zeroBase, SoundFormat& format,
                            std::string& reason) {
     const AVRational base = stream().time_base;
     const std::int64_t origin =
         hasZero ? av_rescale(zero, samplerate_, std::max<std::int64_t>(zeroBase, 1)) : 0;
     places_.set(packets(), counts_,
-                {trustsCounts_, primingScale_, std::max(headerPriming(*stream().codecpar), codecPriming_)},
+                {trustsCounts_, primingScale_,
+                 std::max({headerPriming(*stream().codecpar), codecPriming_, hasZero ? 0 : statedPriming()})},
                 {base.num, base.den, samplerate_, hasZero, origin});
     counts_ = {};
     format.samples = places_.samples();

@@ -85,6 +85,7 @@ class DecodedSamples {
     int send();
     Next decode();
     Next outOfMemory();
+    std::uint32_t statedPriming();
     bool checkStatedCounts();
     bool countByDecoding(std::string& reason);
     void adoptFormat(const AVFrame& frame);

@@ -157,6 +157,21 @@ TEST_F(SampleReaderOfFilms, ofSpeechAreCountedByTheirModes) {
     }
 }
 
+// The number of the track is replaced with a statement of 1024 samples of priming.
+TEST_F(SampleReaderOfFilms, beginAfterThePrimingThatMatroskaStates) {
+    const std::string file = film("a.mka", {"-c:a", "aac"}, "sine=sample_rate=48000:duration=1");
+    std::string bytes = TempFolder::read(file);
+    const std::size_t at = bytes.find("\x73\xC5\x88");
+    ASSERT_NE(at, std::string::npos);
+    const auto nanoseconds = std::string("\x56\xAA\x88") + std::string(4, '\0') + "\x01\x45\x85\x55";
+    const auto plain = open(file);
+    ASSERT_TRUE(plain);
+    const std::string all = read(*plain, 100000);
+    const auto primed = open(folder.write("primed.mka", bytes.replace(at, 11, nanoseconds)));
+    ASSERT_TRUE(primed);
+    EXPECT_TRUE(read(*primed, 100000) == all.substr(1024 * 3));
+}
+
 // Priming and padding are cut: what went in comes out, as long as it was.
 TEST_F(SampleReaderOfFilms, haveTheLengthOfWhatWasEncoded) {
     const struct {
