@@ -182,8 +182,9 @@ void AvDec::addStreams(MediaInput& input, std::string& reason) {
             const AVStream& stream = *container.streams[i];
             if (stream.codecpar->codec_type != AVMEDIA_TYPE_VIDEO || isCover(stream) != covers) continue;
             std::string why;
+            const long long lost = covers ? 0 : length.lost(stream);
             auto reader = FrameReader::open(*bytes_, settings_.container, static_cast<int>(i), index_,
-                                            {settings_.threads, settings_.upright != 0}, why);
+                                            {settings_.threads, settings_.upright != 0, lost > 0}, why);
             if (!reader) {
                 leaveOut(i, why);
                 continue;
@@ -195,7 +196,7 @@ void AvDec::addStreams(MediaInput& input, std::string& reason) {
                                   i, filename().toString().asString(""));
             auto* const added = addStream(std::make_unique<PictureStream>(std::move(reader), &stream));
             const PictureFormat& format = added->reader().format();
-            if (const long long lost = covers ? 0 : length.lost(stream); lost > 0) added->setLost(lost);
+            if (lost > 0) added->setLost(lost);
             if (covers) continue;
             const double start = static_cast<double>(opened.zero()) / static_cast<double>(opened.zeroBase());
             const long long announced =

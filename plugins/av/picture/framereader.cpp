@@ -43,7 +43,7 @@ class FrameReader::Decoding {
     explicit Decoding(std::unique_ptr<DecodedPictures> source)
         : source_(std::move(source)), held_(av_frame_alloc()), coming_(av_frame_alloc()) {}
 
-    bool begin(std::string& reason);
+    bool begin(bool holes, std::string& reason);
     // On success picture() is the one of that presentation number, or the last one before it if it can't be
     // decoded.
     Read show(std::size_t wanted, std::string& failure);
@@ -168,7 +168,7 @@ bool FrameReader::Decoding::findFirst(std::string& reason) {
     return true;
 }
 
-bool FrameReader::Decoding::begin(std::string& reason) {
+bool FrameReader::Decoding::begin(bool holes, std::string& reason) {
     if (!held_ || !coming_) {
         reason = "out of memory";
         return false;
@@ -201,7 +201,7 @@ bool FrameReader::Decoding::begin(std::string& reason) {
     if (!findFirst(reason)) return false;
     if (hasTimes()) {
         const IndexedPacket& last = source_->packets()[pictures_.back().packet];
-        plan_ = planPictures(pictures_, base, hints, last.duration);
+        plan_ = planPictures(pictures_, base, hints, last.duration, holes);
     } else {
         const bool known = rate.num > 0;
         plan_ = planPictures(pictures_, known ? Rational{rate.den, rate.num} : Rational{1, 25}, {}, 1);
@@ -347,7 +347,7 @@ std::unique_ptr<FrameReader> FrameReader::open(const MediaBytes& bytes, const st
     auto source = DecodedPictures::open(bytes, format, stream, std::move(index), options.threads, reason);
     if (!source) return nullptr;
     reader->decoding_ = std::make_unique<Decoding>(std::move(source));
-    if (!reader->decoding_->begin(reason)) return nullptr;
+    if (!reader->decoding_->begin(options.holes, reason)) return nullptr;
     if (!reader->describe(options.upright)) {
         reason = reader->failure_;
         return nullptr;

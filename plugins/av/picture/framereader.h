@@ -22,6 +22,7 @@ class FrameReader : public PictureSource {
     struct Options {
         int threads = 0;       // of the codec; 0: one a core
         bool upright = false;  // rotates as the film's display matrix says, if the pixel format allows it
+        bool holes = false;    // pictures are missing between others; see planPictures
     };
     static std::unique_ptr<FrameReader> open(const MediaBytes& bytes, const std::string& format, int stream,
                                              std::shared_ptr<const PacketIndex> index, const Options& options,

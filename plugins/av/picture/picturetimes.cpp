@@ -102,6 +102,27 @@ std::int64_t presentation(const std::vector<IndexedPacket>& packets, std::size_t
     return std::clamp(latest, -limits::farthest, limits::farthest) + duration;
 }
 
+// Of each frame at that rate, the picture that it shows: the one before it where none is of its time. Empty
+// if a picture lies between frames.
+std::vector<std::uint32_t> shownWithHoles(const std::vector<TimedPicture>& pictures, Rational base,
+                                          Rational rate) {
+    const double period = 1.0 / (number(rate) * number(base));
+    const double length = static_cast<double>(pictures.back().time - pictures.front().time) / period;
+    if (length >= limits::variableFrames) return {};
+    std::vector<std::uint32_t> shown;
+    shown.reserve(static_cast<std::size_t>(length) + 2);
+    for (std::size_t i = 0; i < pictures.size(); ++i) {
+        const double time = static_cast<double>(pictures[i].time - pictures.front().time);
+        const double frame = std::round(time / period);
+        if (std::fabs(time - frame * period) > slack(period) + 1e-6) return {};
+        const auto at = static_cast<std::size_t>(frame);
+        if (at < shown.size()) return {};
+        shown.resize(at, static_cast<std::uint32_t>(i > 0 ? i - 1 : 0));
+        shown.push_back(static_cast<std::uint32_t>(i));
+    }
+    return shown;
+}
+
 }  // namespace
 
 std::vector<TimedPicture> presentedPictures(const std::vector<IndexedPacket>& packets,
@@ -131,13 +152,21 @@ std::vector<TimedPicture> presentedPictures(const std::vector<IndexedPacket>& pa
 }
 
 PicturePlan planPictures(const std::vector<TimedPicture>& pictures, Rational base,
-                         const std::vector<Rational>& hints, std::int64_t lastDuration) {
+                         const std::vector<Rational>& hints, std::int64_t lastDuration, bool holes) {
     PicturePlan plan;
     if (pictures.empty()) return plan;
     const Rational rate = constantRate(pictures, base, hints);
     if (rate.num > 0) {
         plan.rate = QvRatio(static_cast<int>(rate.num), static_cast<int>(rate.den));
         plan.frames = static_cast<int>(std::min<std::size_t>(pictures.size(), limits::frames));
+        return plan;
+    }
+    for (const Rational& hint : hints) {
+        if (!holes || !isRate(hint)) continue;
+        plan.shown = shownWithHoles(pictures, base, hint);
+        if (plan.shown.empty()) continue;
+        plan.rate = QvRatio(static_cast<int>(hint.num), static_cast<int>(hint.den));
+        plan.frames = static_cast<int>(plan.shown.size());
         return plan;
     }
     const std::int64_t first = pictures.front().time, length = pictures.back().time - first;

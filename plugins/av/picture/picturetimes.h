@@ -28,13 +28,16 @@ std::vector<TimedPicture> presentedPictures(const std::vector<IndexedPacket>& pa
 struct PicturePlan {
     QvRatio rate{25, 1};
     bool variable = false;
-    // Of frame n, the picture that it shows. Empty for a constant rate: frame n shows picture n.
+    // Of frame n, the picture that it shows. Empty for a constant rate without holes: frame n shows picture
+    // n.
     std::vector<std::uint32_t> shown;
     int frames = 0;
 };
 // `base`: seconds of a unit of time. `hints`: rates that the container and the codec state, best first; 0 for
-// none. `lastDuration` of the last picture, in units; 0: unknown.
+// none. `lastDuration` of the last picture, in units; 0: unknown. `holes`: pictures are missing because the
+// file is damaged; then a stated rate is constant if all times are frames of it, and the picture before a
+// hole stays.
 PicturePlan planPictures(const std::vector<TimedPicture>& pictures, Rational base,
-                         const std::vector<Rational>& hints, std::int64_t lastDuration);
+                         const std::vector<Rational>& hints, std::int64_t lastDuration, bool holes = false);
 
 }  // namespace av

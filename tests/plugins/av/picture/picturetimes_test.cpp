@@ -77,6 +77,30 @@ TEST(PicturePlan, ratesThatAllTimesFitAreConstant) {
     }
 }
 
+TEST(PicturePlan, holesOfADamagedFileAreHeldAtTheStatedRate) {
+    const struct {
+        const char* what;
+        std::vector<std::int64_t> times;
+        std::vector<av::Rational> hints;
+        QvRatio rate;
+        std::vector<std::uint32_t> shown;
+    } cases[] = {
+        {"the first that fits",
+         {100, 140, 181, 340, 380},
+         {{0, 1}, {30, 1}, {25, 1}},
+         {25, 1},
+         {0, 1, 2, 2, 2, 2, 3, 4}},
+        {"between two frames", {0, 40, 60, 200}, {{25, 1}}, {24000, 1001}, {0, 1, 2, 2, 2, 3}},
+    };
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.what);
+        const av::PicturePlan plan = planPictures(at(c.times), {1, 1000}, c.hints, 40, true);
+        EXPECT_EQ(plan.rate, c.rate) << plan.rate.num << "/" << plan.rate.den;
+        EXPECT_EQ(plan.shown, c.shown);
+        EXPECT_EQ(plan.frames, static_cast<int>(c.shown.size()));
+    }
+}
+
 TEST(PresentedPictures, comeInTheOrderOfTheirTimes) {
     const struct {
         const char* what;
