@@ -129,17 +129,19 @@ bool PacketIndex::continueByTable(const AVFormatContext& container, std::vector<
 }
 
 // Whether what was read of all streams says what they are, and none of them has to be decoded to be counted.
+// False also where packets come after the end that the header states.
 bool PacketIndex::showsStreams(const AVFormatContext& container) const {
     for (unsigned i = 0; i < container.nb_streams; ++i) {
         const AVMediaType type = container.streams[i]->codecpar->codec_type;
         const bool sound = type == AVMEDIA_TYPE_AUDIO;
-        if (!sound && type != AVMEDIA_TYPE_VIDEO) continue;
         const bool cover = (container.streams[i]->disposition & AV_DISPOSITION_ATTACHED_PIC) != 0;
-        const auto counts = [sound](const IndexedPacket& packet) {
-            return packet.pts != AV_NOPTS_VALUE && (!sound || packet.samples != unknownSamples);
+        if (cover || (!sound && type != AVMEDIA_TYPE_VIDEO)) continue;
+        const AVRational base = container.streams[i]->time_base;
+        const auto counts = [&](const IndexedPacket& packet) {
+            return packet.pts != AV_NOPTS_VALUE && (!sound || packet.samples != unknownSamples) &&
+                   av_compare_ts(packet.pts, base, container.duration, AV_TIME_BASE_Q) <= 0;
         };
-        if (streams_[i].size() < (cover ? 1 : 2) ||
-            !std::all_of(streams_[i].begin(), streams_[i].end(), counts))
+        if (streams_[i].size() < 2 || !std::all_of(streams_[i].begin(), streams_[i].end(), counts))
             return false;
     }
     return true;
@@ -157,7 +159,7 @@ std::unique_ptr<PacketIndex> PacketIndex::build(MediaInput& input, std::string& 
         return nullptr;
     }
     const bool tables = from != From::packets && input.leaveBytes();
-    const bool shortly = from == From::survey && statesLength(container);
+    bool shortly = from == From::survey && statesLength(container);
     std::size_t count = 0;
     std::int64_t bytes = 0;
     for (;;) {
@@ -180,10 +182,10 @@ std::unique_ptr<PacketIndex> PacketIndex::build(MediaInput& input, std::string& 
         if (tables && from == From::survey && count == enoughRead &&
             index->continueByTable(container, samples, input.size()))
             break;
-        if (shortly && count % enoughRead == 0 && (count >= enoughForRate || bytes >= enoughBytes) &&
-            index->showsStreams(container)) {
-            index->partial_ = true;
-            break;
+        if (shortly && (count == enoughForRate || (bytes >= enoughBytes && count >= enoughRead))) {
+            index->partial_ = index->showsStreams(container);
+            if (index->partial_) break;
+            shortly = false;
         }
     }
     if (count == 0) {

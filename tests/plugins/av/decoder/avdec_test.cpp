@@ -66,6 +66,10 @@ TEST_F(FilmsInTheTool, whoseHeaderStatesTheirLengthAreNotReadThroughToBeShown) {
              "testsrc2=size=32x32:rate=200:duration=21[out0];sine=sample_rate=8000:duration=20[out1]");
     const std::string bytes = TempFolder::read(file);
     folder.write("cut.mkv", bytes.substr(0, bytes.size() * 95 / 100));
+    const std::string duration = "\x44\x89\x88", tenSeconds = {'\x40', '\xC3', '\x88', 0, 0, 0, 0, 0};
+    const std::size_t stated = bytes.find(duration);
+    ASSERT_NE(stated, std::string::npos);
+    folder.write("lying.mkv", std::string(bytes).replace(stated + duration.size(), 8, tenSeconds));
     const std::string late = TempFolder::read(film(
         "late.mkv", {"-vf", "setpts=PTS+10/TB", "-fps_mode", "passthrough", "-c:v", "mpeg4", "-g", "5"}));
     folder.write("latecut.mkv", late.substr(0, late.size() * 7 / 10));
@@ -76,6 +80,7 @@ TEST_F(FilmsInTheTool, whoseHeaderStatesTheirLengthAreNotReadThroughToBeShown) {
     } cases[] = {
         {{"long.mkv"}, 0, {"about 4200 frames", "about 160000 samples", "SubRip"}, {"subtitles"}},
         {{"long.mkv", "--exact"}, 0, {", 4200 frames", ", 160000 samples", "2 subtitles"}, {"about"}},
+        {{"lying.mkv"}, 0, {", 4200 frames"}, {"about"}},
         {{"cut.mkv"}, 3, {"damaged", "of 4200 frames"}, {"about"}},
         {{"latecut.mkv"}, 3, {"damaged", "of 50 frames"}, {}},
     };
