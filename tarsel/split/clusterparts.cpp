@@ -42,12 +42,7 @@ ClusterParts::ClusterParts(const Scheduler& scheduler, How how)
     : scheduler_(scheduler), how_(std::move(how)) {}
 
 ClusterParts::~ClusterParts() {
-    if (job_.empty() || finished()) return;
-    try {
-        scheduler_.cancel({job_});
-    } catch (const Failure& failed) {
-        tell(Level::warning, failed.what());
-    }
+    if (!job_.empty() && !finished()) sendCancel();
 }
 
 // The script that each element runs, with the task of its index. It does nothing if the element has ended
@@ -170,7 +165,10 @@ void ClusterParts::showPending(const std::vector<ClusterElement>& active) {
 
 // wait() continues until its elements have ended, as they still write into the folder.
 void ClusterParts::cancelJob() {
-    if (std::exchange(cancelSent_, true) || finished()) return;
+    if (!std::exchange(cancelSent_, true) && !finished()) sendCancel();
+}
+
+void ClusterParts::sendCancel() {
     try {
         scheduler_.cancel({job_});
     } catch (const Failure& failed) {

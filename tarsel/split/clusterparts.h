@@ -42,6 +42,7 @@ class ClusterParts : public PartExecutor {
     void queryScheduler();
     void showPending(const std::vector<ClusterElement>& active);
     void cancelJob();
+    void sendCancel();
     bool finished() const;
 
     const Scheduler& scheduler_;

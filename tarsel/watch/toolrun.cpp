@@ -7,16 +7,6 @@
 
 namespace {
 
-double numberIn(const Json& object, const char* key, double otherwise) {
-    const auto place = object.find(key);
-    return place != object.end() && place->is_number() ? place->get<double>() : otherwise;
-}
-
-std::string textIn(const Json& object, const char* key) {
-    const auto place = object.find(key);
-    return place != object.end() && place->is_string() ? place->get<std::string>() : "";
-}
-
 ProgressState progressOf(const Json& object) {
     ProgressState state;
     const double percent = numberIn(object, "percent", -1);
@@ -30,10 +20,7 @@ void takeEnd(const Json& object, ToolResult& result) {
     result.failure = textIn(object, "error");
     result.seconds = numberIn(object, "elapsed_s", 0);
     result.speed = numberIn(object, "speed", -1);
-    const auto outputs = object.find("outputs");
-    if (outputs == object.end() || !outputs->is_array()) return;
-    for (const Json& name : *outputs)
-        if (name.is_string()) result.outputs.push_back(name.get<std::string>());
+    result.outputs = textsIn(object, "outputs");
 }
 
 void takeObject(const std::string& line, ToolResult& result,

@@ -13,6 +13,25 @@ int digitOf(char c) {
 
 }  // namespace
 
+double numberIn(const Json& object, const char* key, double otherwise) {
+    const auto found = object.find(key);
+    return found != object.end() && found->is_number() ? found->get<double>() : otherwise;
+}
+
+std::string textIn(const Json& object, const char* key) {
+    const auto found = object.find(key);
+    return found != object.end() && found->is_string() ? found->get<std::string>() : "";
+}
+
+std::vector<std::string> textsIn(const Json& object, const char* key) {
+    std::vector<std::string> texts;
+    const auto found = object.find(key);
+    if (found == object.end() || !found->is_array()) return texts;
+    for (const Json& text : *found)
+        if (text.is_string()) texts.push_back(text.get<std::string>());
+    return texts;
+}
+
 std::string escapedBytes(const std::string& bytes) {
     std::string text;
     for (const char c : bytes) {
