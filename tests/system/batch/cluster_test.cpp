@@ -432,6 +432,8 @@ TEST_F(RealSlurm, WhatTheControllerForgetsRunsOnce) {
     for (const char* daemon : {"slurmd", "slurmctld"}) endAtOnce(daemon);
     fs::remove_all(machine_ / "state");
     fs::rename(machine_ / "before", machine_ / "state");
+    // Or new jobs get the numbers of those that it has forgotten, and the daemon of the node ends them, too.
+    std::ofstream(machine_ / "slurm.conf", std::ios::app) << "FirstJobId=1000\n";
     start("slurmctld");
     // The elements are there, and only their locks say so.
     ASSERT_TRUE(comes([&] { return slurm({"squeue"}).status == 0; }));
