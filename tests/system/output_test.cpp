@@ -3,6 +3,8 @@
 #include <sys/stat.h>
 #include <sys/un.h>
 
+#include <chrono>
+
 #include "tests/system/tool.h"
 
 namespace {
@@ -325,6 +327,22 @@ TEST_F(Output, ALogThatIsFull) {
         ASSERT_NE(at, std::string::npos) << o.err;
         EXPECT_EQ(o.err.find(line, at + 1), std::string::npos);
     }
+}
+
+// Another program removes a picture that the run has already written, while the run is held up.
+TEST_F(Output, IsCheckedForWhatWasWritten) {
+    Process run(words({"transcode", "testgen:size=320x240,rate=25,duration=40,audio=0", "-o", "p_%04d.png"}),
+                here());
+    std::string first;
+    const auto last = std::chrono::steady_clock::now() + std::chrono::milliseconds(Process::kPatience);
+    while (first.empty() && std::chrono::steady_clock::now() < last)
+        for (const std::string& name : listing())
+            if (name.ends_with(".png")) first = name;
+    run.signal(SIGSTOP);
+    ASSERT_TRUE(std::filesystem::remove(folder.file(first))) << first;
+    run.signal(SIGCONT);
+    failsAs(6, run.finish(), {"it has 999 pictures in place of 1000"}, first);
+    EXPECT_EQ(listing(), std::set<std::string>{"in.wav"});
 }
 
 // Killed while it writes: the next run in the folder removes what is left, and says so unless messages are

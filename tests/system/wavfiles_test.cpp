@@ -28,6 +28,11 @@ std::string bext(std::uint64_t reference) {
     return text("A boat", 256) + text("Recorder", 32) + text("", 32) + "2024-02-2923:59:58" +
            leBytes(reference, 8) + leBytes(1, 2) + std::string(254, '\0');
 }
+std::string repeatedLoudness(int value) {
+    std::string bytes;
+    for (int i = 0; i < 5; ++i) bytes += leBytes(static_cast<std::uint16_t>(value), 2);
+    return bytes;
+}
 std::string cue(const std::vector<unsigned>& samples) {
     std::string data = leBytes(samples.size(), 4);
     for (std::size_t i = 0; i < samples.size(); ++i)
@@ -85,6 +90,27 @@ TEST_F(WavFiles, ClippedSamplesAreCountedOnce) {
                 .err,
             testing::HasSubstr(part))
             << testing::PrintToString(options);
+}
+
+// Loudness in "bext", of the second version on, is that of the samples.
+TEST_F(WavFiles, WhatWasMeasuredIsLostWithItsSound) {
+    constexpr size_t version = 346, loudness = 412;
+    std::string measured = bext(1000);
+    measured.replace(version, 2, leBytes(2, 2)).replace(loudness, 10, repeatedLoudness(-2300));
+    write("take.wav", wavFormat(1, 1, 8000, 16), patternBytes(2 * 800), wavChunk("bext", measured));
+    const struct {
+        Words options;
+        bool kept;
+    } rows[] = {{{}, true},
+                {{"--bits", "24"}, true},
+                {{"--filter", "normalizer:mode=peak,target=-3"}, false},
+                {{"--map", "a:0.0,a:0.0"}, false},
+                {{"--channels", "2"}, false}};
+    for (const auto& row : rows) {
+        works(Words{"transcode", "take.wav", "-o", "out.wav", "-y"} + row.options);
+        EXPECT_EQ(wavPart(out(), "bext").substr(loudness, 10), repeatedLoudness(row.kept ? -2300 : 0x7FFF))
+            << testing::PrintToString(row.options);
+    }
 }
 
 TEST_F(WavFiles, WordsAndMarksFollowTheCut) {

@@ -29,6 +29,7 @@ class FilmTags : public FilmsInTheTool {
                                  "2", "-metadata:s:1", "language=fra", "-metadata:s:2", "language=deu",
                                  "-c:v", "mpeg4", "-c:a", "flac"})
             options.emplace_back(word);
+        options.insert(options.end(), {"-metadata:s:0", "language=swe"});
         if (!timecode.empty()) options.insert(options.end(), {"-timecode", timecode});
         film(name, options, "testsrc2=size=96x64:rate=" + rate + ":duration=2");
     }
@@ -53,6 +54,7 @@ TEST_F(FilmTags, goIntoEachContainerThatHoldsThem) {
                           HasSubstr("chapter   0:00:01.000, Two\n"), HasSubstr(", fra,"),
                           testing::ContainsRegex(", (deu|ger),")))
             << name;
+    EXPECT_THAT(shown("x.mkv"), testing::ContainsRegex("video 0 .*, swe,"));
     const Outcome o = tarsel({"transcode", "a.mkv", "-o", "x.ts"});
     EXPECT_THAT(o.err, HasSubstr("'x.ts' does not hold: chapters, comment, timecode"));
     EXPECT_THAT(made({"a.mkv", "--no-video", "-o", "x.m4a"}),
