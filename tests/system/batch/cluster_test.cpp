@@ -461,8 +461,8 @@ TEST_F(RealSlurm, AJobInPartsHasTheBytesOfTheWhole) {
     failsAs(2, split({"--", "--array=1"}), {"can't be given"}, "own option");
     failsAs(2, tarsel({"run", "t.xml", "--slurm"}), {"--split"}, "no parts");
     EXPECT_EQ(listing(), before);
-    // Parts that Slurm holds are waited for, with its reason. One that is ended from outside fails the job, and
-    // the others are gone with it.
+    // Parts that Slurm holds are waited for, with its reason. One that is ended from outside fails the job,
+    // and the others are gone with it.
     Process endless(words({"transcode", "testgen:size=640x480,rate=25,duration=20000", "--no-audio", "--size",
                            "16x12", "-o", "long.avi", "--split", "2", "--slurm", "--", "--hold"}),
                     surroundings());
