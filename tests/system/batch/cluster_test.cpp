@@ -344,6 +344,10 @@ class RealSlurm : public Cluster {
                 if (row["state"] == "running" && row["job"].is_string() &&
                     kill(processOf(row["id"]), SIGSTOP) == 0)
                     held[row["id"]] = row["job"];
+            // One may have been done by the time it was stopped.
+            for (const Json& row : states())
+                if (row["state"] != "running" && held.erase(row["id"]) > 0)
+                    kill(processOf(row["id"]), SIGCONT);
             return held.size() == queued();
         })) << slurmSays();
         return held;
