@@ -31,16 +31,22 @@ std::string parseMuxOptions(const std::string& text, const char* format, OptionL
     while ((entry = options.next(entry))) {
         const std::string name = entry->key, value = entry->value;
         if (std::find(all.begin(), all.end(), name) == all.end()) {
-            const std::string near = similarNames(name, all);
-            return "'" + name + "' is no option of " + format + (near.empty() ? "" : "; similar: " + near);
+            std::string text = "'";
+            text.append(name).append("' is no option of ").append(format);
+            if (const std::string near = similarNames(name, all); !near.empty())
+                text.append("; similar: ").append(near);
+            return text;
         }
-        if (reorders(name, value))
-            return "the place of the index is the parameter 'fastStart', not '" + name + "=" + value + "'";
+        if (reorders(name, value)) {
+            std::string text = "the place of the index is the parameter 'fastStart', not '";
+            text.append(name).append("=").append(value).append("'");
+            return text;
+        }
         AVFormatContext* made = nullptr;
         checked(avformat_alloc_output_context2(&made, kind, nullptr, nullptr));
         const std::unique_ptr<AVFormatContext, void (*)(AVFormatContext*)> trial(made, avformat_free_context);
         if (trial && checked(av_opt_set(trial.get(), entry->key, entry->value, AV_OPT_SEARCH_CHILDREN)) < 0)
-            return "'" + value + "' is no value of the option " + name;
+            return std::string("'").append(value).append("' is no value of the option ").append(name);
     }
     return "";
 }
